@@ -1,0 +1,64 @@
+// Serial queues and semaphores.
+#pragma once
+
+#include "frame/contract.h"
+#include "platform/task.h"
+
+#include <chrono>
+#include <memory>
+#include <string_view>
+
+namespace QUAZOR_CONTRACT {
+
+// Runs tasks one at a time, in the order of their submission.
+//
+// Any thread may submit, a task of the queue itself included. A task object is destroyed as soon as it has run,
+// before the next one starts. A task must not throw.
+//
+// Destroying a queue never blocks, and may happen in one of its own tasks: tasks that were due still run, those whose
+// delay had not yet passed are destroyed without running.
+class QUAZOR_EXPORT SerialQueue {
+ public:
+  SerialQueue() = default;
+  SerialQueue(const SerialQueue&) = delete;
+  SerialQueue& operator=(const SerialQueue&) = delete;
+  virtual ~SerialQueue();
+
+  // Submits a task; returns without waiting for it.
+  virtual void async(Task task) = 0;
+  // Submits a task that becomes due `delay` from now: behind the tasks that are waiting then, in the order of the due
+  // times. Zero and less are due at once. A delay beyond the clock's range never fires early.
+  virtual void asyncAfter(std::chrono::nanoseconds delay, Task task) = 0;
+};
+
+// A counting semaphore. Any thread.
+class QUAZOR_EXPORT Semaphore {
+ public:
+  Semaphore() = default;
+  Semaphore(const Semaphore&) = delete;
+  Semaphore& operator=(const Semaphore&) = delete;
+  virtual ~Semaphore();
+
+  // Adds one and wakes one waiter.
+  virtual void signal() = 0;
+  // Blocks until the count is above zero, then takes one.
+  virtual void wait() = 0;
+};
+
+// How soon a queue's tasks should run when the machine is busy.
+enum class QualityOfService { kUserInteractive, kDefault, kBackground };
+
+// Makes queues and semaphores. Any thread. What it made may outlive it.
+class QUAZOR_EXPORT Concurrency {
+ public:
+  Concurrency() = default;
+  Concurrency(const Concurrency&) = delete;
+  Concurrency& operator=(const Concurrency&) = delete;
+  virtual ~Concurrency();
+
+  // `label` names the queue to people who look at threads and traces.
+  virtual std::shared_ptr<SerialQueue> makeSerialQueue(std::string_view label, QualityOfService quality) = 0;
+  virtual std::shared_ptr<Semaphore> makeSemaphore(long count) = 0;
+};
+
+}  // namespace QUAZOR_CONTRACT

@@ -1,0 +1,66 @@
+// PixelBuffer: the image buffer of one captured frame; and the handlers that receive frames and events.
+#pragma once
+
+#include "frame/contract.h"
+#include "frame/value.h"
+#include "platform/media_time.h"
+
+#include <cstdint>
+#include <functional>
+#include <optional>
+#include <string>
+#include <string_view>
+#include <utility>
+
+namespace QUAZOR_CONTRACT {
+
+// References are counted by hand, as the hardware's buffer pool does it: whoever wants the buffer beyond the call that
+// handed it over takes a reference, and the buffer goes back to its pool with the last one. Any thread.
+class QUAZOR_EXPORT PixelBuffer {
+ public:
+  PixelBuffer() = default;
+  PixelBuffer(const PixelBuffer&) = delete;
+  PixelBuffer& operator=(const PixelBuffer&) = delete;
+
+  virtual void retain() = 0;
+  virtual void release() = 0;
+  // What the capture service attached to the frame under `key` (platform/capture_keys.h), or nothing. REQUIRES: the
+  // caller has a reference; the value stays good without it. Attachments do not change.
+  virtual std::optional<Value> attachment(std::string_view key) const = 0;
+
+ protected:
+  virtual ~PixelBuffer();
+};
+
+// Called with every frame of an output, on any thread of the capture service, perhaps several at once. The buffer is
+// borrowed for the call. Must return soon: frames wait behind it. May let go of the last reference to its own stream.
+class QUAZOR_EXPORT PixelBufferHandler final : public Object {
+ public:
+  using Function = std::function<void(PixelBuffer& buffer, MediaTime presentationTime)>;
+
+  explicit PixelBufferHandler(Function function) : function_(std::move(function)) {}
+  ~PixelBufferHandler() override;
+
+  void operator()(PixelBuffer& buffer, MediaTime presentationTime) const { function_(buffer, presentationTime); }
+  std::string description() const override;
+
+ private:
+  Function function_;
+};
+
+// Called with every event of an output; as PixelBufferHandler. `info` may be null.
+class QUAZOR_EXPORT EventHandler final : public Object {
+ public:
+  using Function = std::function<void(std::int32_t event, MediaTime time, const Value* info)>;
+
+  explicit EventHandler(Function function) : function_(std::move(function)) {}
+  ~EventHandler() override;
+
+  void operator()(std::int32_t event, MediaTime time, const Value* info) const { function_(event, time, info); }
+  std::string description() const override;
+
+ private:
+  Function function_;
+};
+
+}  // namespace QUAZOR_CONTRACT

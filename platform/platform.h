@@ -1,0 +1,29 @@
+// Platform: the services that stand behind a plug-in, in one bundle.
+#pragma once
+
+#include "frame/contract.h"
+#include "frame/log_channel.h"
+#include "platform/capture_service.h"
+#include "platform/clock.h"
+#include "platform/concurrency.h"
+#include "platform/report_facility.h"
+
+#include <memory>
+
+namespace QUAZOR_CONTRACT {
+
+// Each service is its own narrow interface; a class takes the bundle and uses what it needs. No member is null while
+// plug-ins run.
+struct Platform {
+  std::shared_ptr<CaptureService> capture;
+  std::shared_ptr<Clock> clock;
+  std::shared_ptr<Concurrency> concurrency;
+  std::shared_ptr<ReportFacility> reports;
+};
+
+// The platform that plug-ins get when they are handed no other. The host installs it before it makes experiments, on
+// the thread that it runs them on. The log's back-end is installed at the log itself (LogChannel::setBackend).
+QUAZOR_EXPORT void installPlatform(Platform platform);
+QUAZOR_EXPORT const Platform& installedPlatform();
+
+}  // namespace QUAZOR_CONTRACT
