@@ -1,0 +1,13 @@
+// The report channels that a sound depth camera module publishes.
+#pragma once
+
+#include <string_view>
+#include <vector>
+
+namespace quazor {
+
+// The names of the fault latches and thermistors of the module, 60 of them, all different, in a fixed order. Each call
+// returns a new list; the texts live for ever. Any thread.
+std::vector<std::string_view> expectedTelemonNames();
+
+}  // namespace quazor
