@@ -1,0 +1,35 @@
+#include "backends/threads/parker.h"
+
+#include <linux/futex.h>
+#include <sys/syscall.h>
+#include <unistd.h>
+
+#include <climits>
+#include <ctime>
+
+namespace quazor {
+
+// futex(2). The kernel takes the address of the word itself.
+static_assert(sizeof(std::atomic<std::uint32_t>) == sizeof(std::uint32_t));
+
+void Parker::park(std::chrono::nanoseconds deadline) {
+  timespec absolute{};
+  const timespec* timeout = nullptr;
+  if (deadline != std::chrono::nanoseconds::max()) {
+    const auto seconds = std::chrono::floor<std::chrono::seconds>(deadline);
+    absolute.tv_sec = static_cast<std::time_t>(seconds.count());
+    absolute.tv_nsec = static_cast<long>((deadline - seconds).count());
+    timeout = &absolute;
+  }
+  if (woken_.load(std::memory_order_acquire) != 0) return;
+  // FUTEX_WAIT_BITSET is the form whose timeout is a moment of the steady clock. It returns at once when the word is
+  // no longer 0.
+  syscall(SYS_futex, &woken_, FUTEX_WAIT_BITSET | FUTEX_PRIVATE_FLAG, 0, timeout, nullptr, FUTEX_BITSET_MATCH_ANY);
+}
+
+void Parker::unpark() {
+  woken_.store(1, std::memory_order_release);
+  syscall(SYS_futex, &woken_, FUTEX_WAKE | FUTEX_PRIVATE_FLAG, 1, nullptr, nullptr, 0);
+}
+
+}  // namespace quazor

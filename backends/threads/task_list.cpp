@@ -1,0 +1,60 @@
+#include "backends/threads/task_list.h"
+
+#include <chrono>
+#include <thread>
+
+namespace quazor {
+
+void Backoff::pause() {
+  constexpr int kPolls = 64;
+  constexpr int kYields = 16;
+  ++pauses_;
+  if (pauses_ <= kPolls) {
+    relaxProcessor();
+  } else if (pauses_ <= kPolls + kYields) {
+    std::this_thread::yield();
+  } else {
+    // A thread of lower priority gets no time from one that only yields.
+    std::this_thread::sleep_for(std::chrono::microseconds(50));
+  }
+}
+
+TaskList::TaskList() : head_(new Segment) {
+  tail_.store(reinterpret_cast<std::uintptr_t>(head_), std::memory_order_relaxed);
+}
+
+TaskList::~TaskList() {
+  while (front() != nullptr) pop();
+  delete head_;
+  delete spare_.load(std::memory_order_acquire);
+}
+
+bool TaskList::beginSleep() {
+  std::uintptr_t tail = reinterpret_cast<std::uintptr_t>(head_) + consumed_ * kOneSlot;
+  return tail_.compare_exchange_strong(tail, tail | kAsleep, std::memory_order_acq_rel, std::memory_order_relaxed);
+}
+
+std::uintptr_t TaskList::awaitNextSegment() const {
+  Backoff backoff;
+  std::uintptr_t tail = 0;
+  do {
+    backoff.pause();
+    tail = tail_.load(std::memory_order_relaxed);
+  } while ((tail & kCountMask) == kCountMask);
+  return tail;
+}
+
+void TaskList::linkNextSegment(Segment* full) {
+  Segment* next = spare_.exchange(nullptr, std::memory_order_acquire);
+  if (next == nullptr) next = new Segment;
+  full->next = next;
+  // An exchange and not a store: what endSleep made visible stays so along a chain of exchanges.
+  tail_.exchange(reinterpret_cast<std::uintptr_t>(next), std::memory_order_acq_rel);
+}
+
+void TaskList::recycle(Segment* consumed) {
+  consumed->next = nullptr;
+  delete spare_.exchange(consumed, std::memory_order_acq_rel);
+}
+
+}  // namespace quazor

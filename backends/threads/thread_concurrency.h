@@ -1,0 +1,20 @@
+// ThreadConcurrency: serial queues and semaphores on real threads.
+#pragma once
+
+#include "platform/concurrency.h"
+
+#include <memory>
+#include <string_view>
+
+namespace quazor {
+
+// Stateless. Any thread.
+class ThreadConcurrency final : public Concurrency {
+ public:
+  // A ThreadSerialQueue. A process that can have no more threads is ended, as one without memory is.
+  std::shared_ptr<SerialQueue> makeSerialQueue(std::string_view label, QualityOfService quality) noexcept override;
+  // A ThreadSemaphore.
+  std::shared_ptr<Semaphore> makeSemaphore(long count) override;
+};
+
+}  // namespace quazor

@@ -1,0 +1,18 @@
+#include "backends/threads/thread_semaphore.h"
+
+namespace quazor {
+
+void ThreadSemaphore::signal() {
+  const std::lock_guard lock(mutex_);
+  ++count_;
+  // Under the lock: without it the woken thread could destroy the condition before it has been notified.
+  above_zero_.notify_one();
+}
+
+void ThreadSemaphore::wait() {
+  std::unique_lock lock(mutex_);
+  above_zero_.wait(lock, [this] { return count_ > 0; });
+  --count_;
+}
+
+}  // namespace quazor

@@ -1,0 +1,26 @@
+// ThreadSemaphore: a counting semaphore for real threads.
+#pragma once
+
+#include "platform/concurrency.h"
+
+#include <condition_variable>
+#include <mutex>
+
+namespace quazor {
+
+// With a count below zero, as many signals more are needed before a wait returns.
+class ThreadSemaphore final : public Semaphore {
+ public:
+  explicit ThreadSemaphore(long count) : count_(count) {}
+
+  // The last reference may go as soon as a wait returns, even while the signal that ended it is still returning.
+  void signal() override;
+  void wait() override;
+
+ private:
+  std::mutex mutex_;
+  std::condition_variable above_zero_;
+  long count_;  // guarded by mutex_
+};
+
+}  // namespace quazor
