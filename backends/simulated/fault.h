@@ -1,0 +1,56 @@
+// Fault: one thing that goes wrong on a simulated phone.
+#pragma once
+
+#include <nlohmann/json_fwd.hpp>
+
+#include <cstdint>
+#include <optional>
+#include <string>
+#include <string_view>
+
+namespace quazor {
+
+enum class FaultAction {
+  kFail,     // the call fails with an error: the fault's, or one of the service
+  kNothing,  // the call fails and has no error to give
+  kHang,     // the call never returns: SimulationStall in virtual time, a wait without end in real time
+  kDelay     // the call is made `seconds` late, by the phone's clock
+};
+
+// An error that a fault makes a call fail with.
+struct FaultError {
+  std::string domain;
+  std::int64_t code = 0;
+  std::string message;
+
+  friend bool operator==(const FaultError&, const FaultError&) = default;
+};
+
+// Which calls, and what happens to them. A selector that is not set takes every call.
+//
+// When several faults take one call, delays add up, and the first of the others in the order of the scenario decides.
+struct Fault {
+  std::string operation;                    // such as "CaptureStream.start"; "*" is every operation that can fail
+  std::optional<std::string> object;        // the scenario's id of a camera or a group
+  std::optional<std::string> property;      // the key that the call reads or sets
+  std::optional<std::uint64_t> occurrence;  // the nth call, from 1, among those that the other selectors take
+  FaultAction action = FaultAction::kFail;
+  std::optional<FaultError> error;  // of kFail
+  double seconds = 0;               // of kDelay
+
+  friend bool operator==(const Fault&, const Fault&) = default;
+};
+
+// A fault and how many calls it has changed. One that never fired has proved nothing.
+struct FaultStatus {
+  Fault fault;
+  std::uint64_t fired = 0;
+};
+
+// The fault as it stands in a scenario file.
+nlohmann::ordered_json faultJson(const Fault& fault);
+
+// The word of a scenario file for an action.
+std::string_view faultActionName(FaultAction action);
+
+}  // namespace quazor

@@ -1,0 +1,160 @@
+#include "backends/simulated/json_file.h"
+
+#include <algorithm>
+#include <cstddef>
+#include <cstdint>
+#include <fstream>
+#include <iterator>
+#include <optional>
+#include <set>
+#include <system_error>
+#include <vector>
+
+namespace quazor {
+namespace {
+
+using Json = nlohmann::ordered_json;
+
+// Deeper than any scenario. Bounds the recursion of whoever walks the document.
+constexpr std::size_t kDeepest = 32;
+
+// The length of the UTF-8 sequence at the start of `text`; 0 when it is none (RFC 3629).
+std::size_t sequenceLength(std::string_view text) {
+  const auto at = [&](std::size_t i) { return i < text.size() ? static_cast<unsigned char>(text[i]) : 0U; };
+  const auto continues = [&](std::size_t i) { return (at(i) & 0xC0U) == 0x80U; };
+  const unsigned first = at(0);
+  if (first < 0x80) return 1;
+  if (first >= 0xC2 && first <= 0xDF) return continues(1) ? 2 : 0;
+  if (first >= 0xE0 && first <= 0xEF) {
+    const bool overlong = first == 0xE0 && at(1) < 0xA0;
+    const bool surrogate = first == 0xED && at(1) > 0x9F;
+    return continues(1) && continues(2) && !overlong && !surrogate ? 3 : 0;
+  }
+  if (first >= 0xF0 && first <= 0xF4) {
+    const bool overlong = first == 0xF0 && at(1) < 0x90;
+    const bool beyond = first == 0xF4 && at(1) > 0x8F;
+    return continues(1) && continues(2) && continues(3) && !overlong && !beyond ? 4 : 0;
+  }
+  return 0;
+}
+
+std::optional<std::size_t> firstInvalidUtf8(std::string_view text) {
+  for (std::size_t at = 0; at < text.size();) {
+    const std::size_t length = sequenceLength(text.substr(at));
+    if (length == 0) return at;
+    at += length;
+  }
+  return std::nullopt;
+}
+
+std::string lineAt(std::string_view text, std::size_t offset) {
+  const std::string_view before = text.substr(0, offset);
+  return std::to_string(std::ranges::count(before, '\n') + 1);
+}
+
+// Follows the parser through the document, to know where it stands and which keys an object has had.
+class Tracker {
+ public:
+  explicit Tracker(std::string name) : name_(std::move(name)) {}
+
+  bool operator()(Json::parse_event_t event, const Json& parsed) {
+    switch (event) {
+      case Json::parse_event_t::object_start: open(false); break;
+      case Json::parse_event_t::array_start: open(true); break;
+      case Json::parse_event_t::object_end:
+      case Json::parse_event_t::array_end: open_.pop_back(); break;
+      case Json::parse_event_t::key: key(parsed.get<std::string>()); break;
+      case Json::parse_event_t::value: element(); break;
+    }
+    return true;
+  }
+
+  std::string path() const {
+    std::string path;
+    for (const Container& container : open_) {
+      if (container.isArray && container.elements > 0) path = jsonPath(path, container.elements - 1);
+      if (!container.isArray && !container.key.empty()) path = jsonPath(path, container.key);
+    }
+    return path;
+  }
+
+ private:
+  struct Container {
+    bool isArray = false;
+    std::size_t elements = 0;  // begun so far, of an array
+    std::string key;           // the present one, of an object
+    std::set<std::string> keys;
+  };
+
+  void element() {
+    if (!open_.empty() && open_.back().isArray) ++open_.back().elements;
+  }
+  void open(bool isArray) {
+    element();
+    if (open_.size() == kDeepest) {
+      throw JsonProblem(name_ + ": the document is nested more than " + std::to_string(kDeepest) + " deep.");
+    }
+    open_.push_back({isArray, 0, {}, {}});
+  }
+  void key(const std::string& key) {
+    Container& object = open_.back();
+    object.key.clear();
+    if (!object.keys.insert(key).second) {
+      const std::string where = path();
+      throw JsonProblem(name_ + ": " + (where.empty() ? "" : where + ": ") + "the key " + Json(key).dump() +
+                        " stands twice; leave one of the two.");
+    }
+    object.key = key;
+  }
+
+  std::string name_;
+  std::vector<Container> open_;
+};
+
+// The parser's own words for what it met, without its preamble.
+std::string complaintOf(const Json::parse_error& error) {
+  const std::string text = error.what();
+  const std::size_t dash = text.find(" - ");
+  return dash == std::string::npos ? text : text.substr(dash + 3);
+}
+
+}  // namespace
+
+std::string jsonPath(const std::string& path, std::string_view key) {
+  return path.empty() ? std::string(key) : path + "." + std::string(key);
+}
+
+std::string jsonPath(const std::string& path, std::size_t index) { return path + "[" + std::to_string(index) + "]"; }
+
+Json parseJson(std::string_view text, const std::string& name) {
+  if (const std::optional<std::size_t> invalid = firstInvalidUtf8(text)) {
+    throw JsonProblem(name + ":" + lineAt(text, *invalid) + ": this is not UTF-8; save the file in that encoding.");
+  }
+  Tracker tracker(name);
+  const auto follow = [&](int, Json::parse_event_t event, Json& parsed) { return tracker(event, parsed); };
+  try {
+    return Json::parse(text, follow);
+  } catch (const Json::parse_error& error) {
+    const std::size_t offset = error.byte == 0 ? 0 : error.byte - 1;
+    throw JsonProblem(name + ":" + lineAt(text, offset) + ": this is not JSON: " + complaintOf(error) + ".");
+  } catch (const Json::out_of_range&) {
+    const std::string path = tracker.path();
+    throw JsonProblem(name + ": " + (path.empty() ? "" : path + ": ") +
+                      "the number is too large; a double must hold it.");
+  }
+}
+
+Json readJsonFile(const std::filesystem::path& file) {
+  const std::string name = file.string();
+  std::error_code failure;
+  const std::filesystem::file_status status = std::filesystem::status(file, failure);
+  if (status.type() == std::filesystem::file_type::not_found) throw JsonProblem(name + ": there is no such file.");
+  if (std::filesystem::is_directory(status)) throw JsonProblem(name + ": this is a directory, not a scenario file.");
+  std::ifstream stream(file, std::ios::binary);
+  if (!stream) throw JsonProblem(name + ": the file cannot be opened; check its permissions.");
+  const std::string text{std::istreambuf_iterator<char>(stream), {}};
+  if (stream.bad()) throw JsonProblem(name + ": the file cannot be read.");
+  return parseJson(text, name);
+}
+
+}  // namespace quazor

@@ -1,0 +1,114 @@
+#include "backends/simulated/simulated_phone.h"
+
+#include "backends/simulated/capture_catalogue.h"
+#include "backends/simulated/simulated_capture.h"
+#include "backends/simulated/simulated_reports.h"
+#include "backends/simulated/virtual_services.h"
+#include "backends/threads/real_clock.h"
+#include "backends/threads/thread_concurrency.h"
+
+#include <algorithm>
+#include <chrono>
+#include <mutex>
+#include <stdexcept>
+#include <utility>
+
+namespace quazor {
+namespace {
+
+// The phone's clock as plug-ins have it: their sleeps are calls that observers see.
+class ObservedClock final : public Clock {
+ public:
+  ObservedClock(std::shared_ptr<Clock> clock, std::shared_ptr<CallInterceptor> calls)
+      : clock_(std::move(clock)), calls_(std::move(calls)) {}
+
+  std::chrono::nanoseconds now() const override { return clock_->now(); }
+  Date date() const override { return clock_->date(); }
+  void sleep(std::chrono::nanoseconds duration) override {
+    clock_->sleep(duration);
+    calls_->report(
+        {kClockSleep, {}, {}}, [&] { return defaultText(std::chrono::duration<double>(duration).count()); }, true);
+  }
+
+ private:
+  const std::shared_ptr<Clock> clock_;
+  const std::shared_ptr<CallInterceptor> calls_;
+};
+
+CallInterceptor::Hang sleepForEver(std::shared_ptr<Clock> clock) {
+  return [clock = std::move(clock)](std::string_view) {
+    for (;;) clock->sleep(std::chrono::nanoseconds::max());
+  };
+}
+
+}  // namespace
+
+SimulatedPhone::SimulatedPhone(const Scenario& scenario, PhoneTime time, std::uint64_t seed) {
+  if (time == PhoneTime::kReal) {
+    auto clock = std::make_shared<RealClock>();
+    build(scenario, clock, std::make_shared<ThreadConcurrency>(), sleepForEver(clock));
+  } else {
+    buildVirtual(scenario, std::make_shared<VirtualScheduler>(std::make_shared<SeededChooser>(seed)));
+  }
+}
+
+SimulatedPhone::SimulatedPhone(const Scenario& scenario, std::shared_ptr<VirtualScheduler> scheduler) {
+  buildVirtual(scenario, std::move(scheduler));
+}
+
+SimulatedPhone::SimulatedPhone(const Scenario& scenario, std::shared_ptr<Clock> clock,
+                               std::shared_ptr<Concurrency> concurrency) {
+  build(scenario, clock, std::move(concurrency), sleepForEver(clock));
+}
+
+SimulatedPhone::~SimulatedPhone() {
+  if (scheduler_ != nullptr) scheduler_->discardPending();
+}
+
+void SimulatedPhone::buildVirtual(const Scenario& scenario, std::shared_ptr<VirtualScheduler> scheduler) {
+  scheduler_ = std::move(scheduler);
+  build(scenario, std::make_shared<VirtualClock>(scheduler_), std::make_shared<VirtualConcurrency>(scheduler_),
+        [scheduler = scheduler_](std::string_view what) { scheduler->stall(what); });
+}
+
+void SimulatedPhone::build(const Scenario& scenario, std::shared_ptr<Clock> clock,
+                           std::shared_ptr<Concurrency> concurrency, CallInterceptor::Hang hang) {
+  calls_ = std::make_shared<CallInterceptor>(scenario.faults, clock, std::move(hang));
+  hardware_ = std::make_shared<CaptureHardware>(scenario, clock, concurrency);
+  platform_.capture = std::make_shared<SimulatedCaptureService>(hardware_, calls_);
+  platform_.reports = std::make_shared<SimulatedReportFacility>(scenario.reports, hardware_, calls_);
+  platform_.clock = std::make_shared<ObservedClock>(clock, calls_);
+  platform_.concurrency = std::move(concurrency);
+}
+
+std::vector<FaultStatus> SimulatedPhone::faultStatus() const { return calls_->faultStatus(); }
+
+void SimulatedPhone::addFault(Fault fault) { calls_->addFault(std::move(fault)); }
+
+void SimulatedPhone::observeCalls(std::function<void(const PlatformCall&)> observer) {
+  calls_->observe(std::move(observer));
+}
+
+std::vector<SimulatedPhone::HeldBuffer> SimulatedPhone::buffersHeld() const {
+  std::vector<HeldBuffer> held;
+  for (const PixelBufferPool::Held& buffer : hardware_->pool->held()) {
+    held.push_back({hardware_->cameras[buffer.camera].camera.id, buffer.frame});
+  }
+  return held;
+}
+
+std::uint64_t SimulatedPhone::deliverFrames(std::string_view camera, std::uint64_t count) {
+  std::shared_ptr<FrameDelivery> delivery;
+  {
+    const std::lock_guard lock(hardware_->mutex);
+    const auto state = std::ranges::find_if(
+        hardware_->cameras, [camera](const CameraState& candidate) { return candidate.camera.id == camera; });
+    if (state == hardware_->cameras.end()) {
+      throw std::invalid_argument("The phone has no camera " + std::string(camera) + ".");
+    }
+    delivery = state->delivery;
+  }
+  return delivery == nullptr ? 0 : delivery->push(count);
+}
+
+}  // namespace quazor
