@@ -1,0 +1,261 @@
+#include "host/diagnostic_run.h"
+
+#include "backends/threads/recording_log.h"
+#include "frame/log_channel.h"
+#include "host/idle_platform.h"
+#include "host/test_plugins/fake_diagnostic.h"
+
+#include <gmock/gmock.h>
+#include <gtest/gtest.h>
+
+#include <memory>
+#include <stdexcept>
+#include <string>
+#include <vector>
+
+namespace quazor {
+namespace {
+
+using namespace std::chrono_literals;
+using fake::Behaviour;
+using testing::ElementsAre;
+
+class ManualClock final : public Clock {
+ public:
+  std::chrono::nanoseconds now() const override { return time; }
+  Date date() const override { return Date(time); }
+  void sleep(std::chrono::nanoseconds duration) override { time += duration; }
+
+  std::chrono::nanoseconds time = 7s;
+};
+
+// A phone on which only time passes.
+class TestPhone final : public Phone {
+ public:
+  Platform platform() const override {
+    Platform platform = idlePlatform();
+    platform.clock = clock_;
+    return platform;
+  }
+  std::vector<DeclaredFault> faults() const override { return {{{{"operation", "x"}}, 3}}; }
+
+ private:
+  std::shared_ptr<Clock> clock_ = std::make_shared<ManualClock>();
+};
+
+class DiagnosticRunTest : public testing::Test {
+ protected:
+  DiagnosticRunTest() {
+    diagnostic_.diagnostic = {"Fake",
+                              "Summary.",
+                              "FakeExperiment",
+                              "FakeAnalysis",
+                              [] { return std::make_shared<fake::FakeExperiment>(); },
+                              [] { return std::make_shared<fake::FakeAnalysis>(); }};
+    options_.makePhone = [this] {
+      ++phonesMade_;
+      return std::make_unique<TestPhone>();
+    };
+    options_.seed = 42;
+  }
+
+  DiagnosticRecord run(const std::vector<std::string>& texts = {"duration=2", "measured=90", "minimum=90"}) {
+    diagnostic_.description = describeDiagnostic(diagnostic_.diagnostic);
+    std::vector<Setting> settings;
+    for (const std::string& text : texts) settings.push_back(parseSetting(text));
+    return runDiagnostic(diagnostic_, bindParameters(diagnostic_, nullptr, settings), options_);
+  }
+
+  DiagnosticRecord runWith(Behaviour behaviour) {
+    return run({"duration=2", "measured=90", "minimum=90", "behaviour=" + std::to_string(static_cast<int>(behaviour))});
+  }
+
+  DescribedDiagnostic diagnostic_;
+  RunOptions options_;
+  int phonesMade_ = 0;
+};
+
+std::string textOf(const DiagnosticErrorPtr& error) {
+  return error == nullptr ? ""
+                          : error->domain() + " " + std::to_string(error->code()) + " " + error->localizedDescription();
+}
+
+TEST_F(DiagnosticRunTest, RecordsARunThatPasses) {
+  const DiagnosticRecord record = run();
+  EXPECT_EQ(record.name, "Fake");
+  EXPECT_EQ(record.summary, "Summary.");
+  EXPECT_EQ(record.verdict, Verdict::kPass);
+  EXPECT_EQ(record.error, nullptr);
+  EXPECT_EQ(record.seed, 42U);
+  ASSERT_EQ(record.measuredResults.size(), 2U);
+  EXPECT_EQ(record.measuredResults[0].result.name(), "Count");
+  EXPECT_EQ(record.measuredResults[0].verdict, ResultVerdict::kPass);
+  EXPECT_EQ(record.measuredResults[1].verdict, ResultVerdict::kNone);
+  EXPECT_EQ(*record.measurements.find("Count"), Measurement(90, QZDimensionlessUnit::frames()));
+  EXPECT_EQ(*record.auxiliaryData.find("bytes"), Value(Bytes{0x00, 0xA5}));
+  ASSERT_EQ(record.faults.size(), 1U);
+  EXPECT_EQ(record.faults[0].fired, 3U);
+  EXPECT_EQ(dictionaryOf(record.parameters.experiment), (Dictionary{{"duration", 2}, {"measured", 90}}));
+}
+
+TEST_F(DiagnosticRunTest, FailsOutsideALimit) {
+  const DiagnosticRecord record = run({"duration=2", "measured=89", "minimum=90"});
+  EXPECT_EQ(record.verdict, Verdict::kFail);
+  EXPECT_EQ(record.error, nullptr);
+  EXPECT_EQ(record.measuredResults[0].verdict, ResultVerdict::kFail);
+}
+
+TEST_F(DiagnosticRunTest, TimesTheStagesByThePhonesClock) {
+  const DiagnosticRecord record = run({"duration=2.5", "measured=90"});
+  EXPECT_EQ(record.durations.setup, 0ns);
+  EXPECT_EQ(record.durations.run, 2500ms);
+  EXPECT_EQ(record.durations.teardown, 0ns);
+  EXPECT_EQ(record.durations.analysis, 0ns);
+}
+
+TEST_F(DiagnosticRunTest, KeepsTheLogLinesOfTheChosenLevel) {
+  const auto textsOf = [](const DiagnosticRecord& record) {
+    std::vector<std::string> texts;
+    for (const LogLine& line : record.log) texts.push_back(line.text);
+    return texts;
+  };
+  EXPECT_THAT(textsOf(run()), ElementsAre("an error line", "a default line of 90", "teardown"));
+  options_.logLevel = LogLevel::kError;
+  EXPECT_THAT(textsOf(run()), ElementsAre("an error line"));
+  options_.logLevel = LogLevel::kDebug;
+  const DiagnosticRecord record = run();
+  EXPECT_THAT(textsOf(record), ElementsAre("an error line", "a default line of 90", "a debug line", "teardown"));
+  EXPECT_EQ(record.log[1].time, 0ns);
+  EXPECT_EQ(record.log[2].time, 2s);
+}
+
+TEST_F(DiagnosticRunTest, LetsListenersHearTheRun) {
+  const auto heard = std::make_shared<RecordingLog>();
+  options_.makeListeners = [&heard](const std::shared_ptr<Clock>& clock) {
+    EXPECT_EQ(clock->now(), 7s);
+    return std::vector<RunLog::Listener>{{heard, LogLevel::kError}};
+  };
+  run();
+  EXPECT_EQ(heard->records().size(), 1U);
+}
+
+TEST_F(DiagnosticRunTest, ClosesTheLogAfterwards) {
+  run();
+  EXPECT_FALSE(LogChannel::isEnabled(LogLevel::kError));
+}
+
+TEST_F(DiagnosticRunTest, MakesAPhoneForEveryRun) {
+  run();
+  run();
+  EXPECT_EQ(phonesMade_, 2);
+}
+
+// What happens in a run with each behaviour: its error, and which stages took place.
+struct FailureRow {
+  const char* name;
+  Behaviour behaviour;
+  const char* error;
+  const char* stages;  // setup, run, teardown, analysis: a letter each for what took place
+  std::size_t results;
+};
+
+class FailureTest : public DiagnosticRunTest, public testing::WithParamInterface<FailureRow> {};
+
+TEST_P(FailureTest, EndsInItsErrorAndSkipsWhatMakesNoSense) {
+  const DiagnosticRecord record = runWith(GetParam().behaviour);
+  EXPECT_EQ(record.verdict, Verdict::kError);
+  EXPECT_EQ(textOf(record.error), GetParam().error);
+  std::string stages;
+  if (record.durations.setup) stages += 's';
+  if (record.durations.run) stages += 'r';
+  if (record.durations.teardown) stages += 't';
+  if (record.durations.analysis) stages += 'a';
+  EXPECT_EQ(stages, GetParam().stages);
+  EXPECT_EQ(record.measuredResults.size(), GetParam().results);
+}
+
+constexpr FailureRow kFailures[] = {
+    {"SetupFails", Behaviour::kSetupFails, "FakeDomain 1 setup failed", "s", 0},
+    {"SetupFailsWithoutError", Behaviour::kSetupFailsWithoutError,
+     "QuazorHostErrorDomain 1 setup of FakeExperiment failed without giving an error", "s", 0},
+    {"SetupThrows", Behaviour::kSetupThrows,
+     "QuazorHostErrorDomain 2 setup of FakeExperiment threw an exception: setup threw", "s", 0},
+    {"SetupThrowsAnInteger", Behaviour::kSetupThrowsAnInteger,
+     "QuazorHostErrorDomain 2 setup of FakeExperiment threw something that is not a standard exception", "s", 0},
+    {"RunFails", Behaviour::kRunFails, "FakeDomain 2 run failed", "srt", 0},
+    {"RunFailsWithoutError", Behaviour::kRunFailsWithoutError,
+     "QuazorHostErrorDomain 1 run of FakeExperiment failed without giving an error", "srt", 0},
+    {"RunThrows", Behaviour::kRunThrows, "QuazorHostErrorDomain 2 run of FakeExperiment threw an exception: run threw",
+     "srt", 0},
+    {"TeardownFails", Behaviour::kTeardownFails, "FakeDomain 4 teardown failed", "srta", 2},
+    {"TeardownThrows", Behaviour::kTeardownThrows,
+     "QuazorHostErrorDomain 2 teardown of FakeExperiment threw an exception: teardown threw", "srta", 2},
+    {"RunAndTeardownFail", Behaviour::kRunAndTeardownFail, "FakeDomain 2 run failed", "srt", 0},
+    {"AnalysisSetupFails", Behaviour::kAnalysisSetupFails, "FakeDomain 5 analysis setup failed", "srta", 0},
+    {"AnalysisSetupThrows", Behaviour::kAnalysisSetupThrows,
+     "QuazorHostErrorDomain 2 setup of FakeAnalysis threw an exception: analysis setup threw", "srta", 0},
+    {"AnalyzingFails", Behaviour::kAnalyzingFails, "FakeDomain 6 analyzing failed", "srta", 0},
+    {"AnalyzingFailsWithoutError", Behaviour::kAnalyzingFailsWithoutError,
+     "QuazorHostErrorDomain 1 analyzing of FakeAnalysis failed without giving an error", "srta", 0},
+    {"AnalyzingThrows", Behaviour::kAnalyzingThrows,
+     "QuazorHostErrorDomain 2 analyzing of FakeAnalysis threw an exception: analyzing threw", "srta", 0},
+    {"NothingMeasured", Behaviour::kNothingMeasured, "QuazorHostErrorDomain 4 nothing was measured", "srta", 0},
+    {"BoundInAnotherUnit", Behaviour::kBoundInAnotherUnit,
+     "QuazorHostErrorDomain 5 the result Count cannot be judged: its lower bound is in 'errors' and its value in "
+     "'frames'",
+     "srta", 2},
+    {"NotANumber", Behaviour::kNotANumber,
+     "QuazorHostErrorDomain 5 the result Count cannot be judged: its value is nan", "srta", 2},
+};
+INSTANTIATE_TEST_SUITE_P(Behaviours, FailureTest, testing::ValuesIn(kFailures),
+                         [](const testing::TestParamInfo<FailureRow>& row) { return std::string(row.param.name); });
+
+TEST_F(DiagnosticRunTest, DoesNotTakeAnErrorAfterASuccessForAFailure) {
+  const DiagnosticRecord record = runWith(Behaviour::kRunSucceedsWithError);
+  EXPECT_EQ(record.verdict, Verdict::kPass);
+  EXPECT_EQ(record.error, nullptr);
+}
+
+TEST_F(DiagnosticRunTest, KeepsTheUnderlyingError) {
+  const DiagnosticRecord record = runWith(Behaviour::kRunFails);
+  ASSERT_NE(record.error, nullptr);
+  EXPECT_EQ(textOf(record.error->underlyingError()), "DeepDomain -3 the cause");
+}
+
+TEST_F(DiagnosticRunTest, DoesNotRunWhatCannotBeDescribed) {
+  diagnostic_.diagnostic.makeExperiment = [] { return nullptr; };
+  const DiagnosticRecord record = run({});
+  EXPECT_EQ(record.verdict, Verdict::kError);
+  EXPECT_EQ(textOf(record.error), "QuazorHostErrorDomain 3 the factory of FakeExperiment made nothing");
+  EXPECT_EQ(phonesMade_, 0);
+}
+
+TEST_F(DiagnosticRunTest, EndsInAnErrorWhenAFactoryFailsOnlyForTheRun) {
+  int made = 0;
+  diagnostic_.diagnostic.makeAnalysis = [&made]() -> std::shared_ptr<QZAnalysis> {
+    if (++made == 1) return std::make_shared<fake::FakeAnalysis>();
+    return nullptr;
+  };
+  const DiagnosticRecord record = run();
+  EXPECT_EQ(record.verdict, Verdict::kError);
+  EXPECT_EQ(textOf(record.error), "QuazorHostErrorDomain 3 the factory of FakeAnalysis made nothing");
+  EXPECT_EQ(record.measurements.size(), 1U);
+}
+
+TEST_F(DiagnosticRunTest, MakesANewExperimentOnThePhonesPlatform) {
+  const Clock* clockSeen = nullptr;
+  diagnostic_.diagnostic.makeExperiment = [&clockSeen] {
+    clockSeen = installedPlatform().clock.get();
+    return std::make_shared<fake::FakeExperiment>();
+  };
+  std::shared_ptr<Clock> clockOfRun;
+  options_.makeListeners = [&clockOfRun](const std::shared_ptr<Clock>& clock) {
+    clockOfRun = clock;
+    return std::vector<RunLog::Listener>();
+  };
+  run();
+  EXPECT_EQ(clockSeen, clockOfRun.get());
+}
+
+}  // namespace
+}  // namespace quazor

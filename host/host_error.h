@@ -1,0 +1,48 @@
+// The host's own errors, and the calls into plug-ins that they guard.
+#pragma once
+
+#include "frame/diagnostic_error.h"
+
+#include <cstdint>
+#include <string>
+#include <string_view>
+#include <utility>
+
+namespace quazor {
+
+// What the host itself finds wrong with a diagnostic, as opposed to what the diagnostic says of the hardware.
+inline constexpr std::string_view QuazorHostErrorDomain = "QuazorHostErrorDomain";
+
+// Codes of QuazorHostErrorDomain; they stand in reports, so a number keeps its meaning.
+enum class HostErrorCode : std::int64_t {
+  kNoErrorGiven = 1,     // an operation failed and gave no error
+  kException = 2,        // an operation threw
+  kNothingMade = 3,      // a factory returned null
+  kNothingMeasured = 4,  // the analysis succeeded without one measured result
+  kCannotBeJudged = 5,   // a measured result and its limit do not allow a judgement
+};
+
+DiagnosticErrorPtr hostError(HostErrorCode code, std::string message);
+
+// The error for the exception that is being handled; call it in a handler only. `operation` names what threw.
+DiagnosticErrorPtr errorOfCurrentException(std::string_view operation);
+
+// Calls into a plug-in: `call` gets a fresh error variable and returns whether it succeeded. Whatever it throws stops
+// here. On failure `failure` becomes the error it gave, or one that says that it gave none.
+template <class Call>
+bool callPlugin(std::string_view operation, DiagnosticErrorPtr* failure, Call&& call) {
+  DiagnosticErrorPtr error;
+  try {
+    if (std::forward<Call>(call)(&error)) return true;
+  } catch (...) {
+    *failure = errorOfCurrentException(operation);
+    return false;
+  }
+  if (error == nullptr) {
+    error = hostError(HostErrorCode::kNoErrorGiven, std::string(operation) + " failed without giving an error");
+  }
+  *failure = std::move(error);
+  return false;
+}
+
+}  // namespace quazor

@@ -1,0 +1,30 @@
+// Where the program finds the plug-in, scenarios and profile it was installed with.
+#pragma once
+
+#include <filesystem>
+
+namespace quazor {
+
+// An installation, found from the program's own place: PREFIX/bin/quazor. A build tree has the same layout.
+class Installation {
+ public:
+  explicit Installation(const std::filesystem::path& program);
+
+  // The installation of the running program.
+  static Installation ofThisProgram();
+
+  // The plug-in that is loaded when none is named: the installed one or, where there is none, that beside the program.
+  std::filesystem::path defaultPlugin() const;
+  std::filesystem::path defaultProfile() const;
+  std::filesystem::path defaultScenario() const;
+  // The file that `--phone` means by `name`: a file of that path if there is one, else the installed scenario of that
+  // name ("camera_sync/start_refused") if there is one, else the path as it stands.
+  std::filesystem::path scenario(const std::filesystem::path& name) const;
+
+ private:
+  std::filesystem::path programDirectory_;
+  std::filesystem::path plugins_;
+  std::filesystem::path data_;
+};
+
+}  // namespace quazor

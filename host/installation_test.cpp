@@ -1,0 +1,49 @@
+#include "host/installation.h"
+
+#include "host/test_directory.h"
+
+#include <gtest/gtest.h>
+
+namespace quazor {
+namespace {
+
+class InstallationTest : public testing::Test {
+ protected:
+  Installation installation() const { return Installation(directory_.path() / "bin" / "quazor"); }
+
+  TestDirectory directory_;
+  const std::filesystem::path prefix_ = directory_.path();
+};
+
+TEST_F(InstallationTest, FindsItsFilesFromThePlaceOfTheProgram) {
+  EXPECT_EQ(installation().defaultPlugin(), prefix_ / QUAZOR_PLUGIN_DIRECTORY / "camera_sensor_diagnostics.so");
+  EXPECT_EQ(installation().defaultProfile(), prefix_ / QUAZOR_DATA_DIRECTORY / "profiles/default.json");
+  EXPECT_EQ(installation().defaultScenario(), prefix_ / QUAZOR_DATA_DIRECTORY / "scenarios/healthy.json");
+}
+
+TEST_F(InstallationTest, TakesThePluginBesideTheProgramWhereNoneIsInstalled) {
+  const std::filesystem::path beside = directory_.write("bin/camera_sensor_diagnostics.so", "");
+  EXPECT_EQ(installation().defaultPlugin(), beside);
+  const std::filesystem::path installed =
+      directory_.write(std::filesystem::path(QUAZOR_PLUGIN_DIRECTORY) / "camera_sensor_diagnostics.so", "");
+  EXPECT_EQ(installation().defaultPlugin(), installed);
+}
+
+TEST_F(InstallationTest, FindsAnInstalledScenarioByItsName) {
+  const std::filesystem::path installed =
+      directory_.write(std::filesystem::path(QUAZOR_DATA_DIRECTORY) / "scenarios/sync/refused.json", "{}");
+  EXPECT_EQ(installation().scenario("sync/refused"), installed);
+}
+
+TEST_F(InstallationTest, PrefersAFileOfThatPathToAnInstalledScenario) {
+  const std::filesystem::path file = directory_.write("mine", "{}");
+  EXPECT_EQ(installation().scenario(file), file);
+}
+
+TEST_F(InstallationTest, LeavesAPathThatIsNothingAsItIs) {
+  EXPECT_EQ(installation().scenario("sync/unknown"), "sync/unknown");
+  EXPECT_EQ(installation().scenario("/sync/unknown"), "/sync/unknown");
+}
+
+}  // namespace
+}  // namespace quazor

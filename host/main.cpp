@@ -1,0 +1,38 @@
+// quazor: runs hardware diagnostics from the command line.
+#include "host/commands.h"
+#include "host/exit_code.h"
+#include "host/installation.h"
+
+#include <unistd.h>
+
+#include <cstdlib>
+#include <exception>
+#include <iostream>
+#include <string>
+#include <string_view>
+#include <vector>
+
+namespace {
+
+// Colour is for people at a terminal that can show it, unless they asked for none (https://no-color.org).
+bool wantsColour() {
+  const char* const noColour = std::getenv("NO_COLOR");
+  if (noColour != nullptr && *noColour != '\0') return false;
+  const char* const terminal = std::getenv("TERM");
+  return isatty(STDOUT_FILENO) == 1 && terminal != nullptr && std::string_view(terminal) != "dumb";
+}
+
+}  // namespace
+
+int main(int argc, char** argv) {
+  try {
+    quazor::Console console{std::cout, std::cerr, wantsColour(), isatty(STDERR_FILENO) == 1};
+    const std::vector<std::string> arguments(argv + (argc > 0 ? 1 : 0), argv + argc);
+    return static_cast<int>(quazor::runProgram(arguments, quazor::Installation::ofThisProgram(), console));
+  } catch (const std::exception& exception) {
+    std::cerr << "quazor: an internal error: " << exception.what() << '\n';
+  } catch (...) {
+    std::cerr << "quazor: an internal error\n";
+  }
+  return static_cast<int>(quazor::ExitCode::kInternal);
+}

@@ -1,0 +1,170 @@
+#include "host/parameters.h"
+
+#include "host/exit_code.h"
+#include "host/nearest_name.h"
+#include "host/parameter_number.h"
+
+#include <algorithm>
+
+namespace quazor {
+
+namespace {
+
+constexpr Half kHalves[] = {Half::kExperiment, Half::kAnalysis};
+
+const OrderedMap<QZNumberParameter>& declared(const DescribedDiagnostic& diagnostic, Half half) {
+  const DiagnosticDescription& description = diagnostic.description;
+  return (half == Half::kExperiment ? description.experiment : description.analysis).parameters();
+}
+
+bool sets(const Setting& setting, Half half, std::string_view name) {
+  return (!setting.half || *setting.half == half) && setting.name == name;
+}
+
+// The names that the diagnostics declare in that half or, without one, in any.
+std::vector<std::string> declaredNames(const std::vector<DescribedDiagnostic>& diagnostics, std::optional<Half> half) {
+  std::vector<std::string> names;
+  for (const DescribedDiagnostic& diagnostic : diagnostics) {
+    for (const Half one : kHalves) {
+      if (half && *half != one) continue;
+      for (const auto& [name, ignored] : declared(diagnostic, one)) names.push_back(name);
+    }
+  }
+  return names;
+}
+
+bool contains(const std::vector<std::string>& names, const std::string& name) {
+  return std::find(names.begin(), names.end(), name) != names.end();
+}
+
+// " (NAME could not be described: ...)" for the first such diagnostic: its parameters are not known.
+std::string noteOfUndescribed(const std::vector<DescribedDiagnostic>& diagnostics) {
+  for (const DescribedDiagnostic& one : diagnostics) {
+    if (one.description.error == nullptr) continue;
+    return " (" + one.diagnostic.name + " could not be described: " + one.description.error->localizedDescription() +
+           ")";
+  }
+  return {};
+}
+
+void checkEntry(const Profile& profile, const ProfileEntry& entry, const std::vector<DescribedDiagnostic>& matched) {
+  const bool allDescribed = std::all_of(
+      matched.begin(), matched.end(), [](const DescribedDiagnostic& one) { return one.description.error == nullptr; });
+  if (!allDescribed) return;
+  for (const Half half : kHalves) {
+    const std::vector<std::string> names = declaredNames(matched, half);
+    for (const auto& [name, ignored] : entry.values(half)) {
+      if (contains(names, name)) continue;
+      throw Refusal(ExitCode::kCannotRead, "the profile '" + profile.file.string() + "' sets '" + name +
+                                               "', which no " + std::string(nameOf(half)) + " of '" + entry.name +
+                                               "' takes" + didYouMean(name, names));
+    }
+  }
+}
+
+std::vector<BoundParameter> bindHalf(const DescribedDiagnostic& diagnostic, Half half, const Profile* profile,
+                                     const std::vector<Setting>& settings) {
+  std::vector<BoundParameter> bound;
+  for (const auto& [name, declaration] : declared(diagnostic, half)) {
+    BoundParameter parameter{name, declaration, std::nullopt, {}};
+    const Value* value = profile == nullptr ? nullptr : profile->find(diagnostic.diagnostic.name, half, name);
+    if (value != nullptr) {
+      parameter.value = *value;
+      parameter.source = "profile " + profile->file.filename().string();
+    }
+    for (const Setting& setting : settings) {
+      if (!sets(setting, half, name)) continue;
+      parameter.value = setting.value;
+      parameter.source = "command line";
+    }
+    bound.push_back(std::move(parameter));
+  }
+  return bound;
+}
+
+}  // namespace
+
+Setting parseSetting(const std::string& text) {
+  const std::string what = "--set '" + text + "': ";
+  const std::size_t equals = text.find('=');
+  if (equals == std::string::npos) {
+    throw Refusal(ExitCode::kUsage, what + "it must have the form [experiment.|analysis.]NAME=VALUE");
+  }
+  Setting setting{text, std::nullopt, text.substr(0, equals), 0};
+  for (const Half half : kHalves) {
+    const std::string prefix = std::string(nameOf(half)) + ".";
+    if (setting.half || !setting.name.starts_with(prefix)) continue;
+    setting.half = half;
+    setting.name.erase(0, prefix.size());
+  }
+  if (setting.name.empty()) throw Refusal(ExitCode::kUsage, what + "the parameter's name is missing");
+  std::string problem;
+  const std::optional<Value> value = parseNumber(std::string_view(text).substr(equals + 1), &problem);
+  if (!value) throw Refusal(ExitCode::kUsage, what + problem);
+  setting.value = *value;
+  return setting;
+}
+
+Dictionary dictionaryOf(const std::vector<BoundParameter>& parameters) {
+  Dictionary dictionary;
+  for (const BoundParameter& parameter : parameters) {
+    if (parameter.value) dictionary.set(parameter.name, *parameter.value);
+  }
+  return dictionary;
+}
+
+void checkProfile(const Profile& profile, const std::vector<DescribedDiagnostic>& catalogue, bool allMustExist) {
+  for (const ProfileEntry& entry : profile.entries) {
+    std::vector<DescribedDiagnostic> matched;
+    std::vector<std::string> names;
+    for (const DescribedDiagnostic& one : catalogue) {
+      names.push_back(one.diagnostic.name);
+      if (matchesName(entry.name, one.diagnostic.name)) matched.push_back(one);
+    }
+    if (!matched.empty()) {
+      checkEntry(profile, entry, matched);
+    } else if (allMustExist) {
+      throw Refusal(ExitCode::kCannotRead, "the profile '" + profile.file.string() + "' has an entry '" + entry.name +
+                                               "', which fits no diagnostic" + didYouMean(entry.name, names));
+    }
+  }
+}
+
+void checkSettings(const std::vector<Setting>& settings, const std::vector<DescribedDiagnostic>& selected) {
+  for (std::size_t i = 0; i < settings.size(); ++i) {
+    const Setting& setting = settings[i];
+    const std::vector<std::string> names = declaredNames(selected, setting.half);
+    if (!contains(names, setting.name)) {
+      const std::string where = setting.half ? "no " + std::string(nameOf(*setting.half)) + " of the diagnostics"
+                                             : std::string("none of the diagnostics");
+      throw Refusal(ExitCode::kUsage, "--set '" + setting.text + "': " + where + " takes a parameter '" + setting.name +
+                                          "'" + didYouMean(setting.name, names) + noteOfUndescribed(selected));
+    }
+    for (std::size_t j = 0; j < i; ++j) {
+      const Setting& other = settings[j];
+      const bool overlap = other.name == setting.name && (!other.half || !setting.half || *other.half == *setting.half);
+      if (!overlap) continue;
+      throw Refusal(ExitCode::kUsage,
+                    "--set '" + other.text + "' and --set '" + setting.text + "' set the same parameter twice");
+    }
+  }
+}
+
+BoundParameters bindParameters(const DescribedDiagnostic& diagnostic, const Profile* profile,
+                               const std::vector<Setting>& settings) {
+  return {bindHalf(diagnostic, Half::kExperiment, profile, settings),
+          bindHalf(diagnostic, Half::kAnalysis, profile, settings)};
+}
+
+void requireParameters(const DescribedDiagnostic& diagnostic, const BoundParameters& parameters) {
+  for (const Half half : kHalves) {
+    for (const BoundParameter& one : parameters.of(half)) {
+      if (one.value || !one.declaration.required()) continue;
+      const std::string name = std::string(nameOf(half)) + "." + one.name;
+      throw Refusal(ExitCode::kUsage, diagnostic.diagnostic.name + " needs the parameter " + name +
+                                          "; give it with --set " + name + "=VALUE or in a profile");
+    }
+  }
+}
+
+}  // namespace quazor

@@ -1,0 +1,67 @@
+// From settings and profile to the parameter values of one run, checked against what the diagnostics declare.
+#pragma once
+
+#include "frame/host_records.h"
+#include "frame/value.h"
+#include "host/catalogue.h"
+#include "host/profile.h"
+
+#include <optional>
+#include <string>
+#include <string_view>
+#include <vector>
+
+namespace quazor {
+
+// What one --set says: [experiment.|analysis.]NAME=VALUE.
+struct Setting {
+  std::string text;          // as it was written
+  std::optional<Half> half;  // nothing: wherever the parameter is declared
+  std::string name;
+  Value value;
+};
+
+// Throws a Refusal (kUsage) for a text that is not of that form or whose value is no finite number.
+Setting parseSetting(const std::string& text);
+
+// A declared parameter and its value for a run.
+struct BoundParameter {
+  std::string name;
+  QZNumberParameter declaration;
+  std::optional<Value> value;  // nothing: not set
+  std::string source;          // where the value comes from, for people; empty when not set
+};
+
+struct BoundParameters {
+  std::vector<BoundParameter> experiment;  // in the order of their declaration
+  std::vector<BoundParameter> analysis;
+
+  const std::vector<BoundParameter>& of(Half half) const { return half == Half::kExperiment ? experiment : analysis; }
+};
+
+// The values that are set, as setups take them.
+Dictionary dictionaryOf(const std::vector<BoundParameter>& parameters);
+
+// A diagnostic and what it declares.
+struct DescribedDiagnostic {
+  Diagnostic diagnostic;
+  DiagnosticDescription description;
+};
+
+// Throws a Refusal (kCannotRead) for a profile's parameter that no diagnostic of its entry declares and, if
+// `allMustExist`, for an entry that fits no diagnostic. An entry whose diagnostics could not be described is passed
+// over.
+void checkProfile(const Profile& profile, const std::vector<DescribedDiagnostic>& catalogue, bool allMustExist);
+
+// Throws a Refusal (kUsage) for a setting whose parameter none of the diagnostics declares, and for two settings of one
+// parameter of one diagnostic.
+void checkSettings(const std::vector<Setting>& settings, const std::vector<DescribedDiagnostic>& selected);
+
+// The parameters of one diagnostic: a setting's value wins over the profile's. `profile` may be null.
+BoundParameters bindParameters(const DescribedDiagnostic& diagnostic, const Profile* profile,
+                               const std::vector<Setting>& settings);
+
+// Throws a Refusal (kUsage) when a required parameter has no value.
+void requireParameters(const DescribedDiagnostic& diagnostic, const BoundParameters& parameters);
+
+}  // namespace quazor

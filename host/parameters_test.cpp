@@ -1,0 +1,207 @@
+#include "host/parameters.h"
+
+#include "host/exit_code.h"
+#include "host/host_error.h"
+
+#include <gmock/gmock.h>
+#include <gtest/gtest.h>
+
+#include <functional>
+
+namespace quazor {
+namespace {
+
+using testing::HasSubstr;
+
+QZDescription descriptionWith(const std::vector<std::pair<std::string, bool>>& parameters) {
+  QZDescription description("Summary.");
+  for (const auto& [name, required] : parameters) {
+    description.addParameter(QZNumberParameter("About it.", required), name);
+  }
+  return description;
+}
+
+DescribedDiagnostic diagnosticWith(const std::string& name, const std::vector<std::pair<std::string, bool>>& experiment,
+                                   const std::vector<std::pair<std::string, bool>>& analysis) {
+  DescribedDiagnostic described;
+  described.diagnostic.name = name;
+  described.description.experiment = descriptionWith(experiment);
+  described.description.analysis = descriptionWith(analysis);
+  return described;
+}
+
+DescribedDiagnostic fault() {
+  return diagnosticWith("Fault", {{"frameCount", true}, {"timeout", true}}, {{"frameCount", true}});
+}
+DescribedDiagnostic sync() { return diagnosticWith("Sync.Back", {{"duration", true}}, {}); }
+DescribedDiagnostic relaxed() { return diagnosticWith("Relaxed", {{"gain", false}}, {}); }
+
+DescribedDiagnostic undescribed() {
+  DescribedDiagnostic described = diagnosticWith("Broken", {}, {});
+  described.description.error = hostError(HostErrorCode::kException, "it threw");
+  return described;
+}
+
+Profile profileWith(const std::string& diagnostics) {
+  return parseProfile("dir/some.json", R"({"schema": 1, "diagnostics": )" + diagnostics + "}");
+}
+
+std::vector<Setting> settings(const std::vector<std::string>& texts) {
+  std::vector<Setting> parsed;
+  for (const std::string& text : texts) parsed.push_back(parseSetting(text));
+  return parsed;
+}
+
+std::string refusalOf(ExitCode code, const std::function<void()>& action) {
+  try {
+    action();
+  } catch (const Refusal& refusal) {
+    EXPECT_EQ(refusal.code(), code);
+    return refusal.what();
+  }
+  return "accepted";
+}
+
+TEST(ParseSetting, TakesThePrefixAsTheHalf) {
+  struct Row {
+    const char* text;
+    std::optional<Half> half;
+    const char* name;
+    Value value;
+  };
+  const Row rows[] = {
+      {"duration=3", std::nullopt, "duration", 3},
+      {"experiment.duration=2.5", Half::kExperiment, "duration", 2.5},
+      {"analysis.frameCount=-1", Half::kAnalysis, "frameCount", -1},
+      {"experiment.analysis.x=1", Half::kExperiment, "analysis.x", 1},
+      {"a.b=1", std::nullopt, "a.b", 1},
+      {"experimental=1", std::nullopt, "experimental", 1},
+  };
+  for (const Row& row : rows) {
+    const Setting setting = parseSetting(row.text);
+    EXPECT_EQ(setting.half, row.half) << row.text;
+    EXPECT_EQ(setting.name, row.name) << row.text;
+    EXPECT_EQ(setting.value, row.value) << row.text;
+    EXPECT_EQ(setting.text, row.text);
+  }
+}
+
+TEST(ParseSetting, RefusesOtherForms) {
+  struct Row {
+    const char* text;
+    const char* problem;
+  };
+  constexpr Row kRows[] = {
+      {"", "it must have the form"},
+      {"duration", "it must have the form"},
+      {"=3", "the parameter's name is missing"},
+      {"analysis.=3", "the parameter's name is missing"},
+      {"duration=", "a number is missing"},
+      {"duration=3s", "'3s' is not a number"},
+      {"duration=3=4", "'3=4' is not a number"},
+      {"duration=nan", "'nan' is not a finite number"},
+      {"duration=1e999", "'1e999' is outside the range of numbers"},
+  };
+  for (const Row& row : kRows) {
+    EXPECT_THAT(refusalOf(ExitCode::kUsage, [&] { parseSetting(row.text); }), HasSubstr(row.problem)) << row.text;
+  }
+}
+
+TEST(CheckSettings, RefusesWhatNoneOfTheDiagnosticsTakes) {
+  const auto check = [](const std::vector<std::string>& texts, const std::vector<DescribedDiagnostic>& selected) {
+    return refusalOf(ExitCode::kUsage, [&] { checkSettings(settings(texts), selected); });
+  };
+  EXPECT_EQ(check({"duratoin=3"}, {sync()}),
+            "--set 'duratoin=3': none of the diagnostics takes a parameter 'duratoin'; "
+            "did you mean 'duration'?");
+  EXPECT_EQ(check({"analysis.duration=3"}, {sync()}),
+            "--set 'analysis.duration=3': no analysis of the diagnostics takes a parameter 'duration'");
+  EXPECT_EQ(check({"duration=3", "timeout=3"}, {sync(), fault()}), "accepted");
+  EXPECT_THAT(check({"duration=3"}, {fault()}), HasSubstr("takes a parameter 'duration'"));
+}
+
+TEST(CheckSettings, SaysWhenADiagnosticsParametersAreNotKnown) {
+  EXPECT_THAT(refusalOf(ExitCode::kUsage, [] { checkSettings(settings({"x=3"}), {undescribed()}); }),
+              HasSubstr("(Broken could not be described: it threw)"));
+}
+
+TEST(CheckSettings, RefusesTwoSettingsOfOneParameter) {
+  const auto check = [](const std::vector<std::string>& texts) {
+    return refusalOf(ExitCode::kUsage, [&] { checkSettings(settings(texts), {fault()}); });
+  };
+  EXPECT_EQ(check({"timeout=3", "timeout=4"}), "--set 'timeout=3' and --set 'timeout=4' set the same parameter twice");
+  EXPECT_THAT(check({"frameCount=3", "analysis.frameCount=4"}), HasSubstr("twice"));
+  EXPECT_THAT(check({"experiment.frameCount=3", "experiment.frameCount=3"}), HasSubstr("twice"));
+  EXPECT_EQ(check({"experiment.frameCount=3", "analysis.frameCount=4", "timeout=5"}), "accepted");
+}
+
+TEST(CheckProfile, RefusesAParameterThatNoDiagnosticOfTheEntryTakes) {
+  const auto check = [](const std::string& diagnostics) {
+    return refusalOf(ExitCode::kCannotRead, [&] {
+      checkProfile(profileWith(diagnostics), {sync(), fault(), undescribed()}, true);
+    });
+  };
+  EXPECT_EQ(
+      check(R"({"Sync.*": {"experiment": {"duraton": 3}}})"),
+      "the profile 'dir/some.json' sets 'duraton', which no experiment of 'Sync.*' takes; did you mean 'duration'?");
+  EXPECT_THAT(check(R"({"Sync.*": {"analysis": {"duration": 3}}})"), HasSubstr("no analysis of 'Sync.*' takes"));
+  EXPECT_EQ(check(R"({"[SF]*": {"experiment": {"duration": 3, "timeout": 4}}})"), "accepted");
+  EXPECT_EQ(check(R"({"B*": {"experiment": {"anything": 3}}})"), "accepted");
+}
+
+TEST(CheckProfile, RefusesAnEntryThatFitsNoDiagnosticOnlyWhenAllMustExist) {
+  const Profile profile = profileWith(R"({"Sync.Bakc": {"experiment": {"duration": 3}}})");
+  EXPECT_EQ(
+      refusalOf(ExitCode::kCannotRead, [&] { checkProfile(profile, {sync()}, true); }),
+      "the profile 'dir/some.json' has an entry 'Sync.Bakc', which fits no diagnostic; did you mean 'Sync.Back'?");
+  EXPECT_EQ(refusalOf(ExitCode::kCannotRead, [&] { checkProfile(profile, {sync()}, false); }), "accepted");
+}
+
+TEST(BindParameters, LetsASettingWinOverTheProfile) {
+  const Profile profile = profileWith(R"({"Fault": {"experiment": {"frameCount": 90, "timeout": 10}}})");
+  const BoundParameters bound = bindParameters(fault(), &profile, settings({"experiment.frameCount=5"}));
+  ASSERT_EQ(bound.experiment.size(), 2U);
+  EXPECT_EQ(bound.experiment[0].name, "frameCount");
+  EXPECT_EQ(bound.experiment[0].value, Value(5));
+  EXPECT_EQ(bound.experiment[0].source, "command line");
+  EXPECT_EQ(bound.experiment[1].value, Value(10));
+  EXPECT_EQ(bound.experiment[1].source, "profile some.json");
+  ASSERT_EQ(bound.analysis.size(), 1U);
+  EXPECT_EQ(bound.analysis[0].value, std::nullopt);
+  EXPECT_EQ(bound.analysis[0].source, "");
+}
+
+TEST(BindParameters, SetsAParameterWithoutPrefixWhereverItIsDeclared) {
+  const BoundParameters bound = bindParameters(fault(), nullptr, settings({"frameCount=7"}));
+  EXPECT_EQ(bound.experiment[0].value, Value(7));
+  EXPECT_EQ(bound.analysis[0].value, Value(7));
+  EXPECT_EQ(bound.experiment[1].value, std::nullopt);
+}
+
+TEST(BindParameters, SetsAParameterWithAPrefixOnlyThere) {
+  const BoundParameters bound = bindParameters(fault(), nullptr, settings({"analysis.frameCount=7"}));
+  EXPECT_EQ(bound.experiment[0].value, std::nullopt);
+  EXPECT_EQ(bound.analysis[0].value, Value(7));
+}
+
+TEST(RequireParameters, RefusesARequiredParameterWithoutAValue) {
+  const auto require = [](const DescribedDiagnostic& diagnostic, const std::vector<std::string>& texts) {
+    return refusalOf(ExitCode::kUsage,
+                     [&] { requireParameters(diagnostic, bindParameters(diagnostic, nullptr, settings(texts))); });
+  };
+  EXPECT_EQ(require(sync(), {}),
+            "Sync.Back needs the parameter experiment.duration; give it with "
+            "--set experiment.duration=VALUE or in a profile");
+  EXPECT_THAT(require(fault(), {"experiment.frameCount=1", "timeout=1"}), HasSubstr("analysis.frameCount"));
+  EXPECT_EQ(require(fault(), {"frameCount=1", "timeout=1"}), "accepted");
+  EXPECT_EQ(require(relaxed(), {}), "accepted");
+}
+
+TEST(DictionaryOf, HoldsOnlyWhatIsSet) {
+  const BoundParameters bound = bindParameters(fault(), nullptr, settings({"timeout=2"}));
+  EXPECT_EQ(dictionaryOf(bound.experiment), (Dictionary{{"timeout", 2}}));
+  EXPECT_TRUE(dictionaryOf(bound.analysis).empty());
+}
+
+}  // namespace
+}  // namespace quazor

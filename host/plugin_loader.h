@@ -1,0 +1,25 @@
+// Loading plug-ins into the process.
+#pragma once
+
+#include "frame/lab.h"
+
+#include <filesystem>
+#include <optional>
+#include <string_view>
+#include <vector>
+
+namespace quazor {
+
+// Loads the plug-ins in order; each registers with the process-wide lab. A file that is named twice is loaded once.
+// Plug-ins stay loaded until the process ends, as the lab holds their factories.
+//
+// Throws a Refusal (kCannotRead) when a file cannot be loaded, was built against another version of the contract,
+// registers nothing or a name that is taken, or when a diagnostic names an experiment or analysis that, after all
+// plug-ins have been loaded, nobody has registered.
+void loadPlugins(const std::vector<std::filesystem::path>& files);
+
+// The contract version of the symbol that a dynamic linker's message complains of; nothing when it is about something
+// else.
+std::optional<int> contractVersionIn(std::string_view linkerMessage);
+
+}  // namespace quazor

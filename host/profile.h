@@ -1,0 +1,46 @@
+// Profiles: files with values for the parameters of diagnostics.
+//
+//   {"schema": 1, "diagnostics": {"CameraSyncDiagnostic.*": {"experiment": {"duration": 3}, "analysis": {}}}}
+//
+// An entry's name is a diagnostic's, or a pattern (*, ?, [...]) for several.
+#pragma once
+
+#include "frame/ordered_map.h"
+#include "frame/value.h"
+
+#include <filesystem>
+#include <string>
+#include <vector>
+
+namespace quazor {
+
+// The two halves of a diagnostic, each with parameters of its own.
+enum class Half { kExperiment, kAnalysis };
+
+std::string_view nameOf(Half half);  // "experiment", "analysis"
+
+struct ProfileEntry {
+  std::string name;
+  OrderedMap<Value> experiment;
+  OrderedMap<Value> analysis;
+
+  const OrderedMap<Value>& values(Half half) const { return half == Half::kExperiment ? experiment : analysis; }
+};
+
+struct Profile {
+  std::filesystem::path file;
+  std::vector<ProfileEntry> entries;  // in the order of the file
+
+  // The value for a parameter, or null. The entry with the diagnostic's own name wins over patterns, and of two
+  // patterns the later one; an entry that does not hold the parameter leaves it to the others.
+  const Value* find(const std::string& diagnostic, Half half, std::string_view parameter) const;
+};
+
+// Reads a profile. Throws a Refusal (kCannotRead) that names the file and the place when it cannot be read or is not
+// exactly of the form above.
+Profile readProfile(const std::filesystem::path& file);
+
+// As readProfile, from the file's text.
+Profile parseProfile(const std::filesystem::path& file, const std::string& text);
+
+}  // namespace quazor

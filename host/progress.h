@@ -1,0 +1,69 @@
+// The progress line: what is running, and for how long.
+#pragma once
+
+#include "frame/log_channel.h"
+#include "host/parameters.h"
+
+#include <chrono>
+#include <condition_variable>
+#include <functional>
+#include <memory>
+#include <mutex>
+#include <optional>
+#include <ostream>
+#include <string>
+#include <thread>
+
+namespace quazor {
+
+// The seconds that a run is expected to take: its experiment's parameter "duration", else its "timeout"; nothing when
+// it has neither above zero.
+std::optional<double> expectedSeconds(const BoundParameters& parameters);
+
+// "Running NAME: 1.2 s of 3 s" or, without an expectation, "Running NAME: 1.2 s".
+std::string progressText(const std::string& name, double elapsedSeconds, std::optional<double> expectedSeconds);
+
+// Keeps one line of a terminal up to date while something runs, from 0.3 seconds after its beginning on, and erases it
+// at the end. Any thread.
+class Progress {
+ public:
+  // `terminal` is borrowed; null shows nothing.
+  explicit Progress(std::ostream* terminal) : terminal_(terminal) {}
+  Progress(const Progress&) = delete;
+  Progress& operator=(const Progress&) = delete;
+  ~Progress() { stop(); }
+
+  // REQUIRES: nothing is running.
+  void start(const std::string& name, std::optional<double> expectedSeconds);
+  // When it returns, the line is erased and stays so. Does nothing when nothing is running.
+  void stop();
+  // Erases the line and calls `write`, which may write to the terminal; the line comes back with its next change.
+  void aside(const std::function<void()>& write);
+
+ private:
+  void show(const std::string& name, std::optional<double> expectedSeconds);
+  void erase();
+
+  std::ostream* const terminal_;
+  std::mutex mutex_;  // held while the terminal is written to
+  std::condition_variable wake_;
+  bool running_ = false;  // guarded by mutex_
+  bool shown_ = false;    // guarded by mutex_
+  std::thread thread_;    // touched by start() and stop() only
+};
+
+// Hands log lines on with the progress line out of their way.
+class LogBesideProgress final : public LogBackend {
+ public:
+  // `progress` is borrowed.
+  LogBesideProgress(Progress& progress, std::shared_ptr<LogBackend> backend)
+      : progress_(progress), backend_(std::move(backend)) {}
+
+  void write(LogLevel level, std::string_view subsystem, std::string_view category, std::string_view text) override;
+
+ private:
+  Progress& progress_;
+  const std::shared_ptr<LogBackend> backend_;
+};
+
+}  // namespace quazor

@@ -1,0 +1,35 @@
+// The report for people.
+#pragma once
+
+#include "host/catalogue.h"
+#include "host/diagnostic_run.h"
+#include "host/json_report.h"
+
+#include <ostream>
+#include <string>
+#include <vector>
+
+namespace quazor {
+
+// The limit's name and range: "FrameTotalLimit: = 90", "Min Frame Count: >= 90", "Range: > 1, <= 2"; "-" for none.
+std::string limitText(const std::optional<QZLimit>& limit);
+
+// The error and the errors that caused it, one line each, the nearest first.
+std::string errorText(const DiagnosticErrorPtr& error, std::string_view indent);
+
+// One diagnostic's measured results as a table, then its verdict and, with kError, the error.
+void printRecord(std::ostream& out, const DiagnosticRecord& record, bool colour);
+
+// "PASS  NAME": a record in one line.
+void printVerdict(std::ostream& out, const DiagnosticRecord& record, bool colour);
+
+// How many there were of each verdict, in one line.
+void printSummary(std::ostream& out, const std::vector<DiagnosticRecord>& records);
+
+// Points out each declared fault that never fired: the run does not show what its scenario is for.
+void printUnfiredFaults(std::ostream& out, const DiagnosticRecord& record);
+
+void printList(std::ostream& out, const std::vector<Diagnostic>& diagnostics);
+void printDescriptions(std::ostream& out, const std::vector<BoundDiagnostic>& diagnostics);
+
+}  // namespace quazor

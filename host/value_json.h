@@ -1,0 +1,32 @@
+// Values in JSON. docs/json_output.md is the public description.
+#pragma once
+
+#include "frame/diagnostic_error.h"
+#include "frame/value.h"
+
+#include <nlohmann/json.hpp>
+
+#include <chrono>
+#include <string>
+
+namespace quazor {
+
+// A finite number, or the string "nan", "inf" or "-inf".
+nlohmann::ordered_json numberJson(double number);
+
+// Seconds.
+nlohmann::ordered_json secondsJson(std::chrono::nanoseconds duration);
+
+// Numbers keep their kind, 32-bit floats their shortest decimal form, and not-finite ones follow numberJson; bytes are
+// hexadecimal text; dates, objects and errors are their default text.
+nlohmann::ordered_json valueJson(const Value& value);
+nlohmann::ordered_json dictionaryJson(const Dictionary& dictionary);
+
+// The error's dictionary form, or null.
+nlohmann::ordered_json errorJson(const DiagnosticErrorPtr& error);
+
+// The document as text, indented by two spaces, with a closing newline. Text that is not UTF-8 has U+FFFD where it is
+// not.
+std::string documentText(const nlohmann::ordered_json& document);
+
+}  // namespace quazor
