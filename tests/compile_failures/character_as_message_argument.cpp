@@ -1,0 +1,8 @@
+// refused with: MessageArgument
+#include "frame/message_format.h"
+
+#ifdef CORRECTED
+const std::string message = quazor::formatMessage("%@", "a");
+#else
+const std::string message = quazor::formatMessage("%@", 'a');
+#endif

@@ -1,0 +1,8 @@
+// refused with: deleted
+#include "frame/unit.h"
+
+#ifdef CORRECTED
+const quazor::QZUnit& unit = quazor::QZDimensionlessUnit::frames();
+#else
+const quazor::QZUnit unit = quazor::QZDimensionlessUnit::frames();
+#endif

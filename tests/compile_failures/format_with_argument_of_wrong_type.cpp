@@ -1,0 +1,8 @@
+// refused with: anArgumentDoesNotFitItsPlaceholder
+#include "frame/message_format.h"
+
+#ifdef CORRECTED
+const std::string message = quazor::formatMessage("lamp %lu", 1U);
+#else
+const std::string message = quazor::formatMessage("lamp %lu", "one");
+#endif

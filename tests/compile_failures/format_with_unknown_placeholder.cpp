@@ -1,0 +1,8 @@
+// refused with: theFormatHasAPlaceholderThatIsNotKnown
+#include "frame/message_format.h"
+
+#ifdef CORRECTED
+const std::string message = quazor::formatMessage("lamp %@", "front");
+#else
+const std::string message = quazor::formatMessage("lamp %s", "front");
+#endif

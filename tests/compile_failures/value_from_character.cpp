@@ -1,0 +1,8 @@
+// refused with: char.*Value|Value.*char
+#include "frame/value.h"
+
+#ifdef CORRECTED
+const quazor::Value value = "a";
+#else
+const quazor::Value value = 'a';
+#endif

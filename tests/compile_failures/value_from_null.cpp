@@ -1,0 +1,8 @@
+// refused with: deleted
+#include "frame/value.h"
+
+#ifdef CORRECTED
+const std::optional<quazor::Value> value;
+#else
+const quazor::Value value = nullptr;
+#endif

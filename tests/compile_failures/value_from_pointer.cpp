@@ -1,0 +1,9 @@
+// refused with: int ?\*.*Value|Value.*int ?\*
+#include "frame/value.h"
+
+int number = 1;
+#ifdef CORRECTED
+const quazor::Value value = number;
+#else
+const quazor::Value value = &number;
+#endif

@@ -1,0 +1,17 @@
+// Any text as a profile: a profile, or a refusal with a sentence.
+#include "host/exit_code.h"
+#include "host/profile.h"
+
+#include <cstddef>
+#include <cstdint>
+#include <cstdlib>
+#include <string>
+
+extern "C" int LLVMFuzzerTestOneInput(const std::uint8_t* data, std::size_t size) {
+  try {
+    quazor::parseProfile("profile.json", std::string(reinterpret_cast<const char*>(data), size));
+  } catch (const quazor::Refusal& refusal) {
+    if (std::string(refusal.what()).empty()) std::abort();
+  }
+  return 0;
+}

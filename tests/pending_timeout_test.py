@@ -1,0 +1,42 @@
+#!/usr/bin/env python3
+"""Checks that a pending timeout delays no process's end.
+
+    pending_timeout_test.py PROGRAM
+
+PROGRAM (pending_timeout.cpp) prints the steady clock's nanoseconds and ends. At least one of several runs, and so the
+program and not a busy machine, must be gone within 100 ms from then; every run must succeed.
+"""
+
+import subprocess
+import sys
+import time
+import unittest
+
+RUNS = 10
+LIMIT = 100e6  # nanoseconds
+
+
+def delay(command):
+    """Runs a command and returns the nanoseconds from the moment that it prints to its end."""
+    done = subprocess.run(command, stdout=subprocess.PIPE, text=True, timeout=60, check=True)
+    return time.clock_gettime_ns(time.CLOCK_MONOTONIC) - int(done.stdout)
+
+
+class PendingTimeoutTest(unittest.TestCase):
+    def test_a_process_ends_at_once(self):
+        delays = [delay([PROGRAM]) for _ in range(RUNS)]
+        print(f"gone after {min(delays) / 1e6:.1f} ms at best, {max(delays) / 1e6:.1f} ms at worst of {RUNS} runs")
+        self.assertLess(min(delays), LIMIT)
+
+    def test_a_process_that_lingers_is_noticed(self):
+        lingers = "import time; print(time.clock_gettime_ns(time.CLOCK_MONOTONIC), flush=True); time.sleep(0.15)"
+        self.assertGreater(delay([sys.executable, "-c", lingers]), LIMIT)
+
+    def test_a_process_that_crashes_is_noticed(self):
+        with self.assertRaises(subprocess.CalledProcessError):
+            delay([sys.executable, "-c", "import os; print(1, flush=True); os.abort()"])
+
+
+if __name__ == "__main__":
+    PROGRAM = sys.argv.pop()
+    unittest.main()

@@ -1,0 +1,108 @@
+#!/usr/bin/env python3
+"""Runs the diagnostics on every scenario that the project ships and compares the outcome with what the scenario expects.
+
+usage: scenarios_test.py PROGRAM SCENARIOS
+
+Every scenario must obey the schema and expect an outcome of each diagnostic that it is about, and each of its faults
+must have fired: a run whose fault never fired shows nothing. Exit code 0: all is as expected; 1: something is not.
+"""
+
+import concurrent.futures
+import json
+import os
+import pathlib
+import subprocess
+import sys
+
+import jsonschema
+
+HOST_DOMAIN = "QuazorHostErrorDomain"
+
+
+def merge_patch(target, patch):
+    """RFC 7396."""
+    if not isinstance(patch, dict):
+        return patch
+    merged = dict(target) if isinstance(target, dict) else {}
+    for key, value in patch.items():
+        if value is None:
+            merged.pop(key, None)
+        else:
+            merged[key] = merge_patch(merged.get(key), value)
+    return merged
+
+
+def read(file):
+    """The scenario with the files that it is based on."""
+    content = json.loads(file.read_text(encoding="utf-8"))
+    base = content.pop("base", None)
+    return content if base is None else merge_patch(read(file.parent / base), content)
+
+
+def error_of(error):
+    """The parts of an error that a scenario can expect."""
+    return None if error is None else {key: error[key] for key in ("domain", "code", "message")}
+
+
+def differences(expected, diagnostic):
+    """What a diagnostic's outcome has that the scenario did not expect, as sentences."""
+    error = diagnostic["error"]
+    if error is not None and error["domain"] == HOST_DOMAIN and "error" not in expected:
+        error = None  # the host's own words for a run that gave none
+    pairs = {
+        "verdict": (expected["verdict"], diagnostic["verdict"]),
+        "error": (expected.get("error"), error_of(error)),
+        "failed results": (
+            expected.get("failedResults", []),
+            [result["name"] for result in diagnostic["measuredResults"] if result["verdict"] == "fail"],
+        ),
+    }
+    if "underlying" in expected:
+        pairs["underlying error"] = (expected["underlying"], error_of((error or {}).get("underlying-error")))
+    return [f"{what}: expected {want}, got {got}" for what, (want, got) in pairs.items() if want != got]
+
+
+def problems(program, file):
+    """Runs the diagnostics that a scenario is about; what is not as expected, as sentences."""
+    expectations = read(file).get("expect", {})
+    if not expectations:
+        return ["it expects nothing"]
+    found = []
+    fired = {}
+    run = subprocess.run(
+        [program, "run", *expectations, "--phone", str(file), "--format", "json"],
+        stdout=subprocess.PIPE, stderr=subprocess.PIPE, text=True, timeout=60, check=False)
+    if run.returncode not in (0, 1, 2):
+        return [f"exit code {run.returncode}: {run.stderr}"]
+    diagnostics = {diagnostic["name"]: diagnostic for diagnostic in json.loads(run.stdout)["diagnostics"]}
+    for name, expected in expectations.items():
+        found += [f"{name}: {difference}" for difference in differences(expected, diagnostics[name])]
+        for number, fault in enumerate(diagnostics[name]["faults"]):
+            fired[number] = fired.get(number, 0) + fault["fired"]
+    verdicts = {diagnostics[name]["verdict"] for name in expectations}
+    code = 2 if "error" in verdicts else 1 if "fail" in verdicts else 0
+    if run.returncode != code:
+        found.append(f"exit code {run.returncode} instead of {code}")
+    found += [f"fault {number} never fired" for number, count in fired.items() if count == 0]
+    return found
+
+
+def main():
+    program, folder = sys.argv[1], pathlib.Path(sys.argv[2])
+    schema = json.loads((folder / "scenario.schema.json").read_text(encoding="utf-8"))
+    validator = jsonschema.Draft202012Validator(schema)
+    files = sorted(file for file in folder.rglob("*.json") if file.name != "scenario.schema.json")
+    failed = 0
+    with concurrent.futures.ThreadPoolExecutor(os.cpu_count()) as pool:
+        for file, found in zip(files, pool.map(lambda file: problems(program, file), files)):
+            content = json.loads(file.read_text(encoding="utf-8"))
+            found = [f"schema: {error.message}" for error in validator.iter_errors(content)] + found
+            for sentence in found:
+                print(f"{file.relative_to(folder)}: {sentence}")
+            failed += bool(found)
+    print(f"{len(files)} scenarios, {failed} not as expected")
+    return 1 if failed or not files else 0
+
+
+if __name__ == "__main__":
+    sys.exit(main())
