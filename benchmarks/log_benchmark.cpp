@@ -1,0 +1,48 @@
+// A disabled log line beside a call of an empty function with the same arguments.
+#include "frame/diagnostic_error.h"
+#include "frame/log_channel.h"
+
+#include <benchmark/benchmark.h>
+
+#include <cstdint>
+#include <string>
+
+namespace quazor {
+namespace {
+
+// What an inlined function that does nothing gets.
+template <class... Arguments>
+void nothing(const char*, const Arguments&...) {}
+
+struct Line {
+  std::string port = "PortTypeBack";
+  std::uint64_t index = 16;
+  DiagnosticErrorPtr error = makeError("QZErrorDomain", 5, "The parameter is out of its range.");
+};
+
+// Both loops make the compiler believe that the arguments have changed, so that neither is moved out of the loop.
+void emptyCall(benchmark::State& state) {
+  Line line;
+  for (auto _ : state) {
+    benchmark::DoNotOptimize(&line);
+    benchmark::ClobberMemory();
+    nothing("Failed to set the format index to %@ on %@! %@", line.index, line.port, line.error);
+  }
+}
+
+void disabledLine(benchmark::State& state) {
+  Line line;
+  for (auto _ : state) {
+    benchmark::DoNotOptimize(&line);
+    benchmark::ClobberMemory();
+    logError("Failed to set the format index to %@ on %@! %@", line.index, line.port, line.error);
+  }
+}
+
+BENCHMARK(emptyCall)->Name("log/empty call");
+BENCHMARK(disabledLine)->Name("log/disabled line");
+
+}  // namespace
+}  // namespace quazor
+
+BENCHMARK_MAIN();

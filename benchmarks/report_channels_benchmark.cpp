@@ -1,0 +1,93 @@
+// What a report channel costs a projector fault run: filter, two snapshots, their delta and the result, for phones with
+// few channels and with very many.
+#include "frame/value.h"
+#include "platform/concurrency.h"
+#include "projector_fault/fixed_clock_for_tests.h"
+#include "projector_fault/tessel_fault_experiment.h"
+#include "tests/hand_made_camera.h"
+
+#include <benchmark/benchmark.h>
+
+#include <chrono>
+#include <cstdint>
+#include <memory>
+#include <string_view>
+#include <utility>
+
+namespace quazor {
+namespace {
+
+using SteadyClock = std::chrono::steady_clock;
+
+// All on the calling thread; a timeout never comes.
+class ImmediateQueue final : public SerialQueue {
+ public:
+  void async(Task task) override { task(); }
+  void asyncAfter(std::chrono::nanoseconds, Task) override {}
+};
+
+class NoSemaphore final : public Semaphore {
+ public:
+  void signal() override {}
+  void wait() override {}
+};
+
+class ImmediateConcurrency final : public Concurrency {
+ public:
+  std::shared_ptr<SerialQueue> makeSerialQueue(std::string_view, QualityOfService) override {
+    return std::make_shared<ImmediateQueue>();
+  }
+  std::shared_ptr<Semaphore> makeSemaphore(long) override { return std::make_shared<NoSemaphore>(); }
+};
+
+// Notes the moment at which it is first asked.
+class TimedReports final : public ReportFacility {
+ public:
+  explicit TimedReports(HandMadeReports::Descriptions channels) : reports_(std::move(channels), 5) {}
+
+  std::shared_ptr<const ReportChannelSet> reportWithOnlySimpleChannels(DiagnosticErrorPtr* error) override {
+    asked = SteadyClock::now();
+    return reports_.reportWithOnlySimpleChannels(error);
+  }
+
+  SteadyClock::time_point asked;
+
+ private:
+  HandMadeReports reports_;
+};
+
+// All that a run does from its first question to the report facility on; its stream ends with its first frame, at once.
+// Half of the channels are the run's.
+void channels(benchmark::State& state) {
+  const auto count = static_cast<std::size_t>(state.range(0));
+  const auto stream = std::make_shared<HandMadeStream>();
+  HandMadeBuffer buffer;
+  stream->onCall = [&buffer, frames = stream.get()](std::string_view call) {
+    if (call == "start") frames->deliver(buffer, MediaTime{});
+  };
+  const auto reports = std::make_shared<TimedReports>(handMadeChannels(count));
+  const Platform platform{makeHandMadeCapture(stream), std::make_shared<FixedClock>(),
+                          std::make_shared<ImmediateConcurrency>(), reports};
+  for (auto _ : state) {
+    const auto experiment = std::make_shared<QZTesselFaultExperiment>(platform);
+    auto result = experiment->run(nullptr);
+    const std::chrono::duration<double> taken = SteadyClock::now() - reports->asked;
+    if (result == nullptr || result->measurements().size() != count + 7) state.SkipWithError("the run failed");
+    state.SetIterationTime(taken.count());
+  }
+  state.counters["ns_per_channel"] = benchmark::Counter(
+      static_cast<double>(count) * 1e-9, benchmark::Counter::kIsIterationInvariantRate | benchmark::Counter::kInvert);
+}
+
+BENCHMARK(channels)
+    ->Name("channels")
+    ->Arg(60)
+    ->Arg(10'000)
+    ->Arg(1'000'000)
+    ->UseManualTime()
+    ->Unit(benchmark::kMicrosecond);
+
+}  // namespace
+}  // namespace quazor
+
+BENCHMARK_MAIN();

@@ -1,0 +1,134 @@
+#!/usr/bin/env python3
+"""Runs the benchmarks, compares what has a requirement, and tells the result in the exit code.
+
+usage: run.py DIRECTORY PLUG-IN
+
+DIRECTORY holds the benchmark programs. Every program runs its benchmarks several times, in random order, so that
+what else the machine does meets all of them alike; the medians are compared. A requirement that could not be measured
+counts as missed. Exit code 0: all requirements are met; 1: one is missed; 2: wrong use.
+"""
+
+import json
+import os
+import subprocess
+import sys
+
+REPETITIONS = 7
+PEERS = ("asio strand", "asio pool", "tbb node")
+LINES = ("received frame", "event", "format index", "device supports", "session status")
+# Two queues that are woken by the same system call differ by less than this, in either direction, from run to run.
+WAKE_UP_NOISE = 1.10
+
+
+def run(directory, program, *arguments):
+    """Runs a program; returns the medians of its benchmarks by name."""
+    command = [os.path.join(directory, program), *arguments, f"--benchmark_repetitions={REPETITIONS}",
+               "--benchmark_enable_random_interleaving=true", "--benchmark_report_aggregates_only=true",
+               "--benchmark_format=json"]
+    print(f"running {program} ...", flush=True)
+    done = subprocess.run(command, stdout=subprocess.PIPE, text=True, check=False)
+    if done.returncode != 0:
+        print(f"{program} ended with exit code {done.returncode}")
+        return {}
+    medians = {}
+    for entry in json.loads(done.stdout)["benchmarks"]:
+        if entry.get("aggregate_name") == "median":
+            medians[entry["run_name"]] = entry
+    return medians
+
+
+class Requirements:
+    """Prints each comparison and remembers whether one was missed."""
+
+    def __init__(self):
+        self.missed = 0
+
+    def check(self, text, measured):
+        """`measured` is a function that returns (met, figures); without a figure it raises KeyError."""
+        try:
+            met, figures = measured()
+        except KeyError as missing:
+            met, figures = False, f"not measured: {missing}"
+        self.missed += 0 if met else 1
+        print(f"  {'PASS' if met else 'FAIL'}  {text}: {figures}")
+
+
+def check_serial_queue(requirements, medians):
+    for threads in (1, 2):
+        def rate(queue, threads=threads):
+            return medians[f"throughput/{queue}/real_time/threads:{threads}"]["items_per_second"] / 1e6
+
+        def against_peers(rate=rate):
+            best = max(PEERS, key=rate)
+            return rate("quazor") >= 3 * rate(best), f"{rate('quazor'):.1f} against {rate(best):.1f} ({best}) million/s"
+
+        def against_mutex(rate=rate):
+            return rate("quazor") >= rate("mutex queue"), f"{rate('quazor'):.1f} against {rate('mutex queue'):.1f} million/s"
+
+        producers = f"{threads} producer{'s' if threads > 1 else ''}"
+        requirements.check(f"serial queue, {producers}: three times the best peer", against_peers)
+        requirements.check(f"serial queue, {producers}: no slower than a mutex and a vector", against_mutex)
+
+    def wake_up(queue, counter="median_ns"):
+        return medians[f"wake_up/{queue}/iterations:100/manual_time"][counter] / 1e3
+
+    def against_best():
+        best = min((*PEERS, "mutex queue"), key=wake_up)
+        return (wake_up("quazor") <= WAKE_UP_NOISE * wake_up(best),
+                f"{wake_up('quazor'):.2f} against {wake_up(best):.2f} us ({best})")
+
+    requirements.check(f"wake-up of an idle queue: no slower than the best, within {WAKE_UP_NOISE:.2f}", against_best)
+    for queue in ("quazor", *PEERS, "mutex queue"):
+        key = f"wake_up/{queue}/iterations:100/manual_time"
+        if key in medians:
+            print(f"        wake-up, {queue}: median {wake_up(queue):.2f} us, "
+                  f"99th percentile {wake_up(queue, 'p99_ns'):.2f} us")
+
+
+def check_log(requirements, medians):
+    def disabled():
+        line, empty = (medians[f"log/{name}"]["cpu_time"] for name in ("disabled line", "empty call"))
+        return line <= 2 * empty, f"{line:.2f} against {empty:.2f} ns"
+
+    requirements.check("a disabled log line: at most twice an empty call", disabled)
+
+
+def check_messages(requirements, medians):
+    for name in LINES:
+        def against_libfmt(name=name):
+            ours, libfmt, compiled = (medians[f"message/{name}/{form}"]["cpu_time"]
+                                      for form in ("quazor", "fmt::format", "FMT_COMPILE"))
+            return ours <= libfmt, f"{ours:.1f} against {libfmt:.1f} ns (with FMT_COMPILE {compiled:.1f})"
+
+        requirements.check(f"message \"{name}\": no slower than fmt::format", against_libfmt)
+
+
+def check_load(requirements, medians):
+    def more():
+        plugin, empty = (medians[f"load/{name}/iterations:100/manual_time"]["real_time"]
+                         for name in ("plug-in", "empty shared object"))
+        return plugin - empty < 1000, f"{plugin:.0f} against {empty:.0f} us"
+
+    requirements.check("loading the plug-in: less than 1 ms more than an empty shared object", more)
+
+
+def main():
+    if len(sys.argv) != 3:
+        print(__doc__)
+        return 2
+    directory, plugin = sys.argv[1:]
+    results = (
+        (check_serial_queue, run(directory, "serial_queue_benchmark")),
+        (check_log, run(directory, "log_benchmark")),
+        (check_messages, run(directory, "message_format_benchmark")),
+        (check_load, run(directory, "load_benchmark", plugin, os.path.join(directory, "empty_shared_object.so"))),
+    )
+    requirements = Requirements()
+    for check, medians in results:
+        check(requirements, medians)
+    print("all requirements are met" if requirements.missed == 0 else f"{requirements.missed} requirements are missed")
+    return 0 if requirements.missed == 0 else 1
+
+
+if __name__ == "__main__":
+    sys.exit(main())
