@@ -1,5 +1,6 @@
 #include "backends/threads/task_list.h"
 
+#include <algorithm>
 #include <chrono>
 #include <thread>
 
@@ -26,8 +27,11 @@ TaskList::TaskList() : head_(new Segment) {
 TaskList::~TaskList() {
   while (front() != nullptr) pop();
   delete head_;
-  delete spare_.load(std::memory_order_acquire);
 }
+
+bool TaskList::hasSpares() { return !spares_.empty(); }
+
+void TaskList::freeUnneededSpares() { spares_.freeUnneeded(); }
 
 bool TaskList::beginSleep() {
   std::uintptr_t tail = reinterpret_cast<std::uintptr_t>(head_) + consumed_ * kOneSlot;
@@ -45,16 +49,47 @@ std::uintptr_t TaskList::awaitNextSegment() const {
 }
 
 void TaskList::linkNextSegment(Segment* full) {
-  Segment* next = spare_.exchange(nullptr, std::memory_order_acquire);
+  Segment* next = spares_.take();
   if (next == nullptr) next = new Segment;
   full->next = next;
   // An exchange and not a store: what endSleep made visible stays so along a chain of exchanges.
   tail_.exchange(reinterpret_cast<std::uintptr_t>(next), std::memory_order_acq_rel);
 }
 
-void TaskList::recycle(Segment* consumed) {
-  consumed->next = nullptr;
-  delete spare_.exchange(consumed, std::memory_order_acq_rel);
+TaskList::Spares::~Spares() {
+  while (Segment* const segment = take()) delete segment;
+}
+
+void TaskList::Spares::put(Segment* segment) {
+  const std::lock_guard lock(mutex_);
+  segment->next = std::exchange(first_, segment);
+  ++count_;
+}
+
+TaskList::Segment* TaskList::Spares::take() {
+  const std::lock_guard lock(mutex_);
+  if (first_ == nullptr) return nullptr;
+  Segment* const segment = std::exchange(first_, first_->next);
+  segment->next = nullptr;
+  --count_;
+  unneeded_ = std::min(unneeded_, count_);
+  return segment;
+}
+
+bool TaskList::Spares::empty() {
+  const std::lock_guard lock(mutex_);
+  return first_ == nullptr;
+}
+
+void TaskList::Spares::freeUnneeded() {
+  std::size_t surplus = 0;
+  {
+    const std::lock_guard lock(mutex_);
+    surplus = unneeded_;
+  }
+  for (; surplus > 0; --surplus) delete take();
+  const std::lock_guard lock(mutex_);
+  unneeded_ = count_;
 }
 
 }  // namespace quazor

@@ -15,8 +15,9 @@
 // 4. The consumer goes to sleep by setting the asleep bit, and only while the tail is where the consumer is: nothing
 //    is claimed then. The claim that follows clears the bit, and so learns, from the same instruction, that there is
 //    somebody to wake. A producer that finds the consumer awake does one atomic instruction and no system call.
-// 5. A segment whose slots are all consumed is kept as the one spare, from which the next link is made; a spare that
-//    was there already is freed. So memory follows the number of waiting tasks.
+// 5. A segment whose slots are all consumed becomes a spare, from which the next link is made. The consumer frees, from
+//    time to time, the spares that were not needed since the last time. So memory follows the number of waiting tasks,
+//    and a list that is as busy as it was before allocates nothing.
 #pragma once
 
 #include "platform/task.h"
@@ -24,6 +25,7 @@
 #include <atomic>
 #include <cstddef>
 #include <cstdint>
+#include <mutex>
 #include <utility>
 
 namespace quazor {
@@ -80,6 +82,13 @@ class TaskList {
   // Thread: the consumer.
   [[nodiscard]] bool beginSleep();
 
+  // True when memory is kept that no task lies in, beyond the segment in use.
+  // Thread: the consumer.
+  bool hasSpares();
+  // Frees what was not needed since the last call.
+  // Thread: the consumer.
+  void freeUnneededSpares();
+
  private:
   static constexpr std::size_t kSlots = 127;
   static constexpr std::uintptr_t kAsleep = 1;
@@ -100,17 +109,32 @@ class TaskList {
     Segment* next = nullptr;  // written before the last slot is published, read after
   };
 
+  // Segments without tasks, linked through their `next`. The one used last is used first: it may still be in the cache.
+  class Spares {
+   public:
+    ~Spares();
+    void put(Segment* segment);
+    // Null when there is none.
+    Segment* take();
+    bool empty();
+    void freeUnneeded();
+
+   private:
+    std::mutex mutex_;          // taken once for each segment, twice in its life
+    Segment* first_ = nullptr;  // guarded by mutex_, as all that follows
+    std::size_t count_ = 0;
+    std::size_t unneeded_ = 0;  // the lowest count since freeUnneeded
+  };
+
   static Segment* segmentOf(std::uintptr_t tail) { return reinterpret_cast<Segment*>(tail & ~(kSegmentAlignment - 1)); }
   // Claims a slot; returns the tail as it was before.
   std::uintptr_t claim();
   std::uintptr_t awaitNextSegment() const;
   void linkNextSegment(Segment* full);
-  void recycle(Segment* consumed);
 
   // Written by the producers.
   alignas(kCacheLine) std::atomic<std::uintptr_t> tail_;
-  // Written once for each segment.
-  alignas(kCacheLine) std::atomic<Segment*> spare_{nullptr};
+  alignas(kCacheLine) Spares spares_;
   // The consumer's own: the slot that it consumes next.
   alignas(kCacheLine) Segment* head_;
   std::size_t consumed_ = 0;  // slots of head_; always below kSlots
@@ -152,7 +176,7 @@ inline void TaskList::pop() {
   if (++consumed_ == kSlots) [[unlikely]] {
     Segment* const consumed = std::exchange(head_, head_->next);
     consumed_ = 0;
-    recycle(consumed);
+    spares_.put(consumed);
   }
 }
 

@@ -122,6 +122,38 @@ TEST(TaskListTest, ATaskMayPushWhileItRunsAndWhileItIsDestroyed) {
   EXPECT_EQ(ran, 600);
 }
 
+// Lets so many tasks wait at one time that they lie in `segments` segments beyond the first, and runs them.
+void fillAndRun(TaskList& list, int segments) {
+  for (int i = 0; i < 127 * segments; ++i) EXPECT_FALSE(list.push([] {}));
+  while (runOne(list)) {
+  }
+}
+
+TEST(TaskListTest, KeepsTheMemoryOfABurstForTheNextOne) {
+  TaskList list;
+  EXPECT_FALSE(list.hasSpares());
+  fillAndRun(list, 3);
+  EXPECT_TRUE(list.hasSpares());
+  list.freeUnneededSpares();
+  EXPECT_TRUE(list.hasSpares()) << "they were needed until now";
+}
+
+TEST(TaskListTest, FreesTheMemoryThatWasNotNeededSinceTheLastTime) {
+  TaskList list;
+  fillAndRun(list, 3);
+  list.freeUnneededSpares();
+  fillAndRun(list, 2);
+  list.freeUnneededSpares();
+  EXPECT_TRUE(list.hasSpares()) << "two of the three were needed";
+  fillAndRun(list, 2);
+  list.freeUnneededSpares();
+  EXPECT_TRUE(list.hasSpares());
+  list.freeUnneededSpares();
+  EXPECT_FALSE(list.hasSpares());
+  fillAndRun(list, 3);
+  EXPECT_TRUE(list.hasSpares());
+}
+
 TEST(TaskListTest, ManyProducersLoseNothingAndKeepEachTheirOrder) {
   constexpr std::size_t kProducers = 4;
   constexpr int kTasks = 20'000;

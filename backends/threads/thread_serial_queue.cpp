@@ -8,6 +8,7 @@
 #include <sys/resource.h>
 #include <unistd.h>
 
+#include <algorithm>
 #include <atomic>
 #include <string>
 #include <thread>
@@ -43,7 +44,7 @@ void lowerPriorityOfThisThread() {
 // What the queue and its thread share. The thread holds it until its end.
 class ThreadSerialQueue::Worker {
  public:
-  explicit Worker(QualityOfService quality) : polls_(quality == QualityOfService::kBackground ? 0 : kPolls) {}
+  explicit Worker(QualityOfService quality) : most_polls_(quality == QualityOfService::kBackground ? 0 : kPolls) {}
 
   // Any thread that holds the queue.
   void post(Task task) {
@@ -78,6 +79,10 @@ class ThreadSerialQueue::Worker {
  private:
   // About five microseconds: as long as a sleep and a wake-up take.
   static constexpr int kPolls = 200;
+  // So few that they cost nothing, and enough to notice that the next task comes soon again.
+  static constexpr int kFewestPolls = 10;
+  // Memory that was of no use for so long is given back.
+  static constexpr std::chrono::nanoseconds kMemoryPeriod = std::chrono::milliseconds(100);
 
   void push(Task&& task) {
     if (tasks_.push(std::move(task))) [[unlikely]]
@@ -101,12 +106,17 @@ class ThreadSerialQueue::Worker {
     return true;
   }
 
-  // Watches for a task for a short time. True when one has come.
+  // Watches for a task for a short time. True when one has come. Watches the shorter the more often it was in vain: the
+  // next task is far off then, or the thread that is to post it waits for this very processor.
   bool poll() {
     for (int i = 0; i < polls_; ++i) {
       relaxProcessor();
-      if (tasks_.front() != nullptr) return true;
+      if (tasks_.front() != nullptr) {
+        polls_ = most_polls_;
+        return true;
+      }
     }
+    polls_ = std::min(most_polls_, std::max(kFewestPolls, polls_ / 2));
     return false;
   }
 
@@ -120,15 +130,29 @@ class ThreadSerialQueue::Worker {
     }
     // From here on every post, every earlier due time and the end of the queue wakes this thread; what came before is
     // visible to it.
-    if (!closed_.load(std::memory_order_acquire)) parker_.park(delayed_.nextDue());
+    if (!closed_.load(std::memory_order_acquire)) parker_.park(std::min(delayed_.nextDue(), tidyMemory()));
     static_cast<void>(tasks_.endSleep());
+  }
+
+  // Gives memory back when it is time to. Returns when it will be time again.
+  std::chrono::nanoseconds tidyMemory() {
+    if (!tasks_.hasSpares()) return DelayedTasks::kNever;
+    const std::chrono::nanoseconds now = steadyNow();
+    if (now >= next_tidying_) {
+      tasks_.freeUnneededSpares();
+      next_tidying_ = now + kMemoryPeriod;
+    }
+    return next_tidying_;
   }
 
   TaskList tasks_;
   Parker parker_;
   DelayedTasks delayed_;
   std::atomic<bool> closed_{false};
-  const int polls_;
+  // The thread's own.
+  const int most_polls_;
+  int polls_ = most_polls_;
+  std::chrono::nanoseconds next_tidying_{};
 };
 
 ThreadSerialQueue::ThreadSerialQueue(std::string_view label, QualityOfService quality)

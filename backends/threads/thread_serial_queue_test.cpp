@@ -4,11 +4,13 @@
 
 #include <gtest/gtest.h>
 
+#include <malloc.h>
 #include <pthread.h>
 #include <sys/resource.h>
 #include <unistd.h>
 
 #include <chrono>
+#include <cstddef>
 #include <cstdlib>
 #include <filesystem>
 #include <fstream>
@@ -101,6 +103,31 @@ TEST(ThreadSerialQueueTest, AQueueThatIsDroppedEndsItsThread) {
     std::this_thread::sleep_for(std::chrono::milliseconds(1));
   }
   EXPECT_EQ(threadsNamed("to be dropped"), 0);
+}
+
+TEST(ThreadSerialQueueTest, AnIdleQueueGivesBackTheMemoryOfItsBusiestMoment) {
+#if defined(__SANITIZE_ADDRESS__) || defined(__SANITIZE_THREAD__)
+  GTEST_SKIP() << "a sanitizer's allocator does not tell what is in use";
+#elif defined(__has_feature)
+#if __has_feature(address_sanitizer) || __has_feature(thread_sanitizer)
+  GTEST_SKIP() << "a sanitizer's allocator does not tell what is in use";
+#endif
+#endif
+  constexpr std::size_t kTasks = 20'000;
+  constexpr std::size_t kLeast = kTasks * sizeof(Task);
+  const auto inUse = [] { return ::mallinfo2().uordblks; };
+  ThreadSerialQueue queue("memory", QualityOfService::kDefault);
+  const std::size_t before = askThread(queue, inUse);
+  ThreadSemaphore gate(0);
+  queue.async([&gate] { gate.wait(); });
+  for (std::size_t i = 0; i < kTasks; ++i) queue.async([] {});
+  EXPECT_GE(inUse(), before + kLeast);
+  gate.signal();
+  askThread(queue, [] { return 0; });
+  for (int i = 0; i < 5000 && inUse() > before + kLeast / 10; ++i) {
+    std::this_thread::sleep_for(std::chrono::milliseconds(1));
+  }
+  EXPECT_LE(inUse(), before + kLeast / 10);
 }
 
 TEST(ThreadSerialQueueTest, DroppingAQueueDoesNotWaitForItsTask) {
