@@ -1,0 +1,64 @@
+# How this project declares its targets.
+
+set(QUAZOR_WARNINGS -Wall -Wextra -Wpedantic -Wconversion -Wshadow -Wnon-virtual-dtor)
+
+# What every target of ours is compiled with. Nothing of it reaches a target of somebody else.
+function(quazor_configure target)
+  target_compile_features(${target} PUBLIC cxx_std_20)
+  target_compile_options(${target} PRIVATE ${QUAZOR_WARNINGS})
+  if(QUAZOR_WERROR)
+    target_compile_options(${target} PRIVATE -Werror)
+  endif()
+  set_target_properties(${target} PROPERTIES CXX_EXTENSIONS OFF CXX_VISIBILITY_PRESET hidden
+                        VISIBILITY_INLINES_HIDDEN ON POSITION_INDEPENDENT_CODE ON)
+  if(QUAZOR_SANITIZE)
+    target_compile_options(${target} PRIVATE -fsanitize=${QUAZOR_SANITIZE} -fno-sanitize-recover=all
+                           -fno-omit-frame-pointer)
+    target_link_options(${target} PRIVATE -fsanitize=${QUAZOR_SANITIZE})
+  endif()
+  if(QUAZOR_COVERAGE)
+    # Several threads count at once.
+    target_compile_options(${target} PRIVATE --coverage -fno-inline -fprofile-update=atomic)
+    target_link_options(${target} PRIVATE --coverage)
+  endif()
+endfunction()
+
+# quazor_library(NAME SOURCES ... DEPENDS ...): a folder's own static library, linked as quazor::NAME.
+function(quazor_library name)
+  cmake_parse_arguments(ARG "" "" "SOURCES;DEPENDS" ${ARGN})
+  add_library(quazor_${name} STATIC ${ARG_SOURCES})
+  add_library(quazor::${name} ALIAS quazor_${name})
+  target_include_directories(quazor_${name} PUBLIC ${PROJECT_SOURCE_DIR})
+  target_link_libraries(quazor_${name} PUBLIC ${ARG_DEPENDS})
+  quazor_configure(quazor_${name})
+endfunction()
+
+# quazor_plugin(NAME SOURCES ... DEPENDS ...): a loadable plug-in NAME.so, beside which the host finds it.
+function(quazor_plugin name)
+  cmake_parse_arguments(ARG "" "" "SOURCES;DEPENDS" ${ARGN})
+  add_library(${name} MODULE ${ARG_SOURCES})
+  target_include_directories(${name} PRIVATE ${PROJECT_SOURCE_DIR})
+  target_link_libraries(${name} PRIVATE ${ARG_DEPENDS})
+  quazor_configure(${name})
+  # Whatever a plug-in uses it must name: a symbol that nothing provides is found when it is linked.
+  target_link_options(${name} PRIVATE -Wl,--no-undefined -Wl,--exclude-libs,ALL)
+  if(QUAZOR_SANITIZE AND CMAKE_CXX_COMPILER_ID MATCHES Clang)
+    target_link_options(${name} PRIVATE -Wl,-z,undefs)  # clang leaves the sanitizer's runtime to the program
+  endif()
+  set_target_properties(${name} PROPERTIES PREFIX "" INSTALL_RPATH "$ORIGIN/.."
+                        LIBRARY_OUTPUT_DIRECTORY ${PROJECT_BINARY_DIR}/${QUAZOR_PLUGIN_DIRECTORY})
+endfunction()
+
+# quazor_test(NAME SOURCES ... DEPENDS ...): a test program of GoogleTest cases, and its CTest entry.
+function(quazor_test name)
+  if(NOT QUAZOR_TESTS)
+    return()
+  endif()
+  cmake_parse_arguments(ARG "" "" "SOURCES;DEPENDS" ${ARGN})
+  add_executable(${name} ${ARG_SOURCES})
+  target_include_directories(${name} PRIVATE ${PROJECT_SOURCE_DIR})
+  target_link_libraries(${name} PRIVATE ${ARG_DEPENDS} GTest::gmock GTest::gtest_main)
+  quazor_configure(${name})
+  set_target_properties(${name} PROPERTIES RUNTIME_OUTPUT_DIRECTORY ${PROJECT_BINARY_DIR}/tests)
+  add_test(NAME ${name} COMMAND ${name} --gtest_brief=1)
+endfunction()
