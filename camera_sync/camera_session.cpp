@@ -31,10 +31,12 @@ Array arrayOf(const CaptureStreams& streams) { return Array(streams.begin(), str
 
 // Every stream delivers its own frames, each frame of the master's paired with one of the slave's.
 Dictionary slaveConfiguration() {
-  return Dictionary{{std::string(capture_key::StreamingOutputsEnabled), true},
-                    {std::string(capture_key::FrameSkippingEnabled), false},
-                    {std::string(capture_key::TimeMachineEnabled), false},
-                    {std::string(capture_key::MasterToSlaveFrameRateRatio), 1}};
+  Dictionary configuration;
+  configuration.set(capture_key::StreamingOutputsEnabled, true);
+  configuration.set(capture_key::FrameSkippingEnabled, false);
+  configuration.set(capture_key::TimeMachineEnabled, false);
+  configuration.set(capture_key::MasterToSlaveFrameRateRatio, 1);
+  return configuration;
 }
 
 bool holdsString(const std::optional<Value>& list, std::string_view text) {

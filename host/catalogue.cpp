@@ -77,6 +77,7 @@ bool isPattern(const std::string& text) { return text.find_first_of("*?[") != st
 
 std::vector<std::string> namesOf(const std::vector<Diagnostic>& diagnostics) {
   std::vector<std::string> names;
+  names.reserve(diagnostics.size());
   for (const Diagnostic& diagnostic : diagnostics) names.push_back(diagnostic.name);
   return names;
 }

@@ -19,19 +19,19 @@ enum class Command { kList, kDescribe, kRun };
 
 // What a command line asks for. Options that its command does not have keep their defaults.
 struct Options {
-  Command command = Command::kList;
   std::vector<std::string> names;
-  bool all = false;
   std::vector<std::filesystem::path> plugins;  // none: the installed one
-  std::filesystem::path phone;                 // empty: the installed healthy one
-  bool realTime = false;
-  std::uint64_t seed = 0;
   std::vector<Setting> settings;
-  std::optional<LogLevel> logLevel;
-  bool systemLog = false;
-  ReportOptions report;
   std::filesystem::path profile;  // empty: the installed one
+  std::filesystem::path phone;    // empty: the installed healthy one
+  ReportOptions report;
+  std::uint64_t seed = 0;
+  std::optional<LogLevel> logLevel;
+  Command command = Command::kList;
+  bool all = false;
   bool withoutProfile = false;
+  bool realTime = false;
+  bool systemLog = false;
 };
 
 // The options of a command line, or nothing when it has been answered at once: with the help or the version, on `out`,

@@ -40,6 +40,7 @@ std::vector<BoundDiagnostic> bindDiagnostics(const Options& options, const Insta
   const std::vector<Diagnostic> wanted = options.all ? catalogue : selectDiagnostics(catalogue, options.names);
   if (wanted.empty()) throw Refusal(ExitCode::kUsage, "the loaded plug-ins have no diagnostic");
   std::vector<DescribedDiagnostic> described;
+  described.reserve(catalogue.size());
   for (const Diagnostic& one : catalogue) described.push_back({one, describeDiagnostic(one)});
 
   std::optional<Profile> profile;
@@ -102,22 +103,23 @@ ExitCode describe(const Options& options, const Installation& installation, Cons
 }
 
 RunOptions runOptionsOf(const Options& options, const Installation& installation, Progress& progress) {
-  RunOptions run;
+  RunOptions runOptions;
   const std::filesystem::path scenario =
       options.phone.empty() ? installation.defaultScenario() : installation.scenario(options.phone);
-  run.makePhone = phonesOfScenario(scenario, options.realTime, options.seed);
-  run.seed = options.seed;
-  run.logLevel = options.logLevel.value_or(LogLevel::kDefault);
+  runOptions.makePhone = phonesOfScenario(scenario, options.realTime, options.seed);
+  runOptions.seed = options.seed;
+  runOptions.logLevel = options.logLevel.value_or(LogLevel::kDefault);
   const LogLevel shown = options.logLevel.value_or(LogLevel::kError);
   std::shared_ptr<LogBackend> system;
   if (options.systemLog) system = std::make_shared<SystemLog>();
-  run.makeListeners = [shown, kept = run.logLevel, system, &progress](const std::shared_ptr<Clock>& clock) {
+  runOptions.makeListeners = [shown, kept = runOptions.logLevel, system,
+                              &progress](const std::shared_ptr<Clock>& clock) {
     auto console = std::make_shared<LogBesideProgress>(progress, std::make_shared<StandardErrorLog>(clock));
     std::vector<RunLog::Listener> listeners{{std::move(console), shown}};
     if (system != nullptr) listeners.push_back({system, kept});
     return listeners;
   };
-  return run;
+  return runOptions;
 }
 
 ExitCode run(const Options& options, const Installation& installation, Console& console) {

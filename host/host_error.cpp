@@ -1,6 +1,6 @@
 #include "host/host_error.h"
 
-#include <exception>
+#include <utility>
 
 namespace quazor {
 
@@ -8,10 +8,10 @@ DiagnosticErrorPtr hostError(HostErrorCode code, std::string message) {
   return errorWithMessage(QuazorHostErrorDomain, static_cast<std::int64_t>(code), std::move(message), nullptr);
 }
 
-DiagnosticErrorPtr errorOfCurrentException(std::string_view operation) {
+DiagnosticErrorPtr errorOfException(std::string_view operation, const std::exception_ptr& thrown) {
   std::string message(operation);
   try {
-    throw;
+    std::rethrow_exception(thrown);
   } catch (const std::exception& exception) {
     message += " threw an exception: ";
     message += exception.what();

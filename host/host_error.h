@@ -4,6 +4,7 @@
 #include "frame/diagnostic_error.h"
 
 #include <cstdint>
+#include <exception>
 #include <string>
 #include <string_view>
 #include <utility>
@@ -24,8 +25,8 @@ enum class HostErrorCode : std::int64_t {
 
 DiagnosticErrorPtr hostError(HostErrorCode code, std::string message);
 
-// The error for the exception that is being handled; call it in a handler only. `operation` names what threw.
-DiagnosticErrorPtr errorOfCurrentException(std::string_view operation);
+// The error for an exception that came out of a plug-in. `operation` names what threw.
+DiagnosticErrorPtr errorOfException(std::string_view operation, const std::exception_ptr& thrown);
 
 // Calls into a plug-in: `call` gets a fresh error variable and returns whether it succeeded. Whatever it throws stops
 // here. On failure `failure` becomes the error it gave, or one that says that it gave none.
@@ -35,7 +36,7 @@ bool callPlugin(std::string_view operation, DiagnosticErrorPtr* failure, Call&& 
   try {
     if (std::forward<Call>(call)(&error)) return true;
   } catch (...) {
-    *failure = errorOfCurrentException(operation);
+    *failure = errorOfException(operation, std::current_exception());
     return false;
   }
   if (error == nullptr) {

@@ -4,11 +4,13 @@
 
 #include <fcntl.h>
 #include <gtest/gtest.h>
+#include <sys/resource.h>
 #include <sys/stat.h>
 #include <unistd.h>
 
+#include <csignal>
 #include <iterator>
-#include <thread>
+#include <string>
 
 namespace quazor {
 namespace {
@@ -58,6 +60,21 @@ TEST_F(OutputFileTest, WritesToWhatIsNoRegularFileAsItIs) {
   EXPECT_STREQ(text, "text");
   ::close(reader);
   EXPECT_TRUE(fs::is_fifo(pipe));
+}
+
+TEST_F(OutputFileTest, LeavesTheOldContentAndNothingElseWhenWritingFails) {
+  const fs::path file = directory_.write("out", "old");
+  rlimit before{};
+  ASSERT_EQ(getrlimit(RLIMIT_FSIZE, &before), 0);
+  const auto handler = std::signal(SIGXFSZ, SIG_IGN);
+  const rlimit small{4, before.rlim_max};  // bytes that a file may have
+  ASSERT_EQ(setrlimit(RLIMIT_FSIZE, &small), 0);
+  const std::string problem = writeOutputFile(file, "longer than that");
+  setrlimit(RLIMIT_FSIZE, &before);
+  std::signal(SIGXFSZ, handler);
+  EXPECT_EQ(problem, "File too large");
+  EXPECT_EQ(directory_.read("out"), "old");
+  EXPECT_EQ(entriesIn(directory_.path()), 1U);
 }
 
 TEST_F(OutputFileTest, TellsWhyItFailed) {

@@ -1,5 +1,6 @@
 #include "host/parameters.h"
 
+#include "frame/message_format.h"
 #include "host/exit_code.h"
 #include "host/nearest_name.h"
 #include "host/parameter_number.h"
@@ -160,9 +161,10 @@ void requireParameters(const DescribedDiagnostic& diagnostic, const BoundParamet
   for (const Half half : kHalves) {
     for (const BoundParameter& one : parameters.of(half)) {
       if (one.value || !one.declaration.required()) continue;
-      const std::string name = std::string(nameOf(half)) + "." + one.name;
-      throw Refusal(ExitCode::kUsage, diagnostic.diagnostic.name + " needs the parameter " + name +
-                                          "; give it with --set " + name + "=VALUE or in a profile");
+      const std::string name = formatMessage("%@.%@", nameOf(half), one.name);
+      throw Refusal(ExitCode::kUsage,
+                    formatMessage("%@ needs the parameter %@; give it with --set %@=VALUE or in a profile",
+                                  diagnostic.diagnostic.name, name, name));
     }
   }
 }

@@ -1,13 +1,16 @@
 #include "host/profile.h"
 
+#include "frame/message_format.h"
 #include "host/catalogue.h"
 #include "host/exit_code.h"
 #include "host/nearest_name.h"
 
 #include <nlohmann/json.hpp>
 
+#include <algorithm>
 #include <cerrno>
 #include <cmath>
+#include <cstdint>
 #include <cstring>
 #include <fstream>
 #include <set>
@@ -51,7 +54,7 @@ void checkKeys(const std::filesystem::path& file, const std::string& place, cons
   if (!object.is_object()) refuse(file, "is wrong at " + place + ": an object must stand there");
   for (const auto& [key, ignored] : object.items()) {
     if (std::find(known.begin(), known.end(), key) != known.end()) continue;
-    refuse(file, "is wrong at " + place + ": '" + key + "' is not known there" + didYouMean(key, known));
+    refuse(file, formatMessage("is wrong at %@: '%@' is not known there%@", place, key, didYouMean(key, known)));
   }
 }
 
@@ -65,7 +68,9 @@ Value numberOf(const std::filesystem::path& file, const std::string& place, cons
 OrderedMap<Value> valuesOf(const std::filesystem::path& file, const std::string& place, const Json& json) {
   if (!json.is_object()) refuse(file, "is wrong at " + place + ": an object must stand there");
   OrderedMap<Value> values;
-  for (const auto& [name, value] : json.items()) values.set(name, numberOf(file, place + "/" + name, value));
+  for (const auto& [name, value] : json.items()) {
+    values.set(name, numberOf(file, formatMessage("%@/%@", place, name), value));
+  }
   return values;
 }
 

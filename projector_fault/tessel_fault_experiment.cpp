@@ -140,9 +140,10 @@ bool QZTesselFaultExperiment::_configureStream(DiagnosticErrorPtr* error) {
     underlying = nullptr;
     return _stream->setValue(value, key, &underlying);
   };
-  const Dictionary structuredLight{{std::string(capture_key::Mode), kStructuredLightMode},
-                                   {std::string(capture_key::StructuredLightCurrent), kStructuredLightCurrent},
-                                   {std::string(capture_key::StructuredLightPattern), kStructuredLightPattern}};
+  Dictionary structuredLight;
+  structuredLight.set(capture_key::Mode, kStructuredLightMode);
+  structuredLight.set(capture_key::StructuredLightCurrent, kStructuredLightCurrent);
+  structuredLight.set(capture_key::StructuredLightPattern, kStructuredLightPattern);
   if (!set(capture_key::InfraredLightSourceConfiguration, structuredLight)) {
     failCapture(error, tessel_fault_error::kLightRefused, underlying, "Failed to configure structured light!");
     return false;
