@@ -31,7 +31,7 @@ using SteadyClock = std::chrono::steady_clock;
 class OpenConcurrency final : public Concurrency {
  public:
   std::shared_ptr<SerialQueue> makeSerialQueue(std::string_view label, QualityOfService quality) override {
-    auto queue = threads_.makeSerialQueue(label, quality);
+    auto queue = threads_.makeSerialQueue(label, QualityOfService::kDefault);
     (quality == QualityOfService::kBackground ? processing : receiving) = queue;
     return queue;
   }

@@ -51,8 +51,10 @@ std::shared_ptr<const QZTesselFrameDescription> QZTesselFrameDescription::descri
   auto record = std::make_shared<QZTesselFrameDescription>(clock);
   record->_monotonicCount = monotonicCount;
   record->_presentationTime = presenationTime;
+  auto next = metadata.begin();  // where the number is when the service lists them in this order, as it mostly does
   for (std::size_t i = 0; i < kNumberCount; ++i) {
-    const Value* number = metadata.find(kMetadataKeys[i]);
+    const bool isNext = next != metadata.end() && next->first == kMetadataKeys[i];
+    const Value* number = isNext ? &next++->second : metadata.find(kMetadataKeys[i]);
     if (number != nullptr && number->isNumber()) {
       record->_numbers[i] = *number;
     } else if (i != kFloodActiveTemperature) {
