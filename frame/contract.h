@@ -8,7 +8,7 @@
 #pragma once
 
 #ifndef QUAZOR_CONTRACT_VERSION
-#define QUAZOR_CONTRACT_VERSION 1
+#define QUAZOR_CONTRACT_VERSION 2
 #endif
 
 #define QUAZOR_CONTRACT_NAME_(version) contract_##version

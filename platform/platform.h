@@ -6,7 +6,10 @@
 #include "platform/capture_service.h"
 #include "platform/clock.h"
 #include "platform/concurrency.h"
+#include "platform/framebuffer_service.h"
+#include "platform/hid.h"
 #include "platform/report_facility.h"
+#include "platform/run_loop.h"
 
 #include <memory>
 
@@ -19,6 +22,9 @@ struct Platform {
   std::shared_ptr<Clock> clock;
   std::shared_ptr<Concurrency> concurrency;
   std::shared_ptr<ReportFacility> reports;
+  std::shared_ptr<HidService> hid{};
+  std::shared_ptr<FramebufferService> framebuffer{};
+  std::shared_ptr<RunLoops> runLoops{};
 };
 
 // The platform that plug-ins get when they are handed no other. The host installs it before it makes experiments, on
