@@ -112,6 +112,35 @@ def check_load(requirements, medians):
     requirements.check("loading the plug-in: less than 1 ms more than an empty shared object", more)
 
 
+def check_pipeline(requirements, medians):
+    def handler():
+        entry = medians["handler/one behind the other/iterations:20000/manual_time"]
+        return entry["p99_ns"] < 2000, f"median {entry['median_ns']:.0f} ns, 99th percentile {entry['p99_ns']:.0f} ns"
+
+    def frames(pipeline):
+        return medians[f"frames/{pipeline}/iterations:5/manual_time"]["items_per_second"] / 1e6
+
+    def memory():
+        entry = medians["memory/an hour of frames/iterations:1"]
+        return entry["growth_kb"] <= 64, f"{entry['growth_kb']:.0f} KiB more than after five minutes"
+
+    requirements.check("frame handler, all busy: 99th percentile under 2 us", handler)
+    requirements.check("frames through the pipeline: a million a second",
+                       lambda: (frames("quazor") >= 1, f"{frames('quazor'):.2f} million/s"))
+    requirements.check("frames through the pipeline: twice as many as on asio strands",
+                       lambda: (frames("quazor") >= 2 * frames("asio strands"),
+                                f"{frames('quazor'):.2f} against {frames('asio strands'):.2f} million/s"))
+    requirements.check("an hour of frames: memory stays the same", memory)
+
+
+def check_channels(requirements, medians):
+    def flat():
+        costs = [medians[f"channels/{count}/manual_time"]["ns_per_channel"] for count in (60, 10_000, 1_000_000)]
+        return max(costs) <= 2 * min(costs), " / ".join(f"{cost:.0f}" for cost in costs) + " ns"
+
+    requirements.check("a report channel of 60, 10,000 and 1,000,000: costs the same within 2 times", flat)
+
+
 def main():
     if len(sys.argv) != 3:
         print(__doc__)
@@ -122,6 +151,8 @@ def main():
         (check_log, run(directory, "log_benchmark")),
         (check_messages, run(directory, "message_format_benchmark")),
         (check_load, run(directory, "load_benchmark", plugin, os.path.join(directory, "empty_shared_object.so"))),
+        (check_pipeline, run(directory, "projector_pipeline_benchmark")),
+        (check_channels, run(directory, "report_channels_benchmark")),
     )
     requirements = Requirements()
     for check, medians in results:

@@ -36,7 +36,7 @@ class OrderedMap {
       return;
     }
     entries_.emplace_back(std::string(key), std::move(value));
-    if (entries_.size() > kScanLimit) addToIndex(entries_.size() - 1);
+    if (entries_.size() > kScanLimit || !slots_.empty()) addToIndex(entries_.size() - 1);
   }
 
   // The value under `key`, or null.
@@ -50,11 +50,15 @@ class OrderedMap {
     if (entry == nullptr) return false;
     entries_.erase(entries_.begin() + (entry - entries_.data()));
     slots_.clear();
-    if (entries_.size() > kScanLimit) rebuildIndex();
+    if (entries_.size() > kScanLimit) rebuildIndex(entries_.size());
     return true;
   }
 
-  void reserve(std::size_t count) { entries_.reserve(count); }
+  // Makes room for `count` entries in all.
+  void reserve(std::size_t count) {
+    entries_.reserve(count);
+    if (count > kScanLimit && slots_.size() < count * 2) rebuildIndex(count);
+  }
   std::size_t size() const { return entries_.size(); }
   bool empty() const { return entries_.empty(); }
   const_iterator begin() const { return entries_.begin(); }
@@ -107,15 +111,16 @@ class OrderedMap {
 
   void addToIndex(std::size_t position) {
     if (slots_.size() < entries_.size() * 2) {
-      rebuildIndex();
+      rebuildIndex(entries_.size() * 2);
     } else {
       place(position);
     }
   }
 
-  void rebuildIndex() {
+  // An index with room for `count` entries.
+  void rebuildIndex(std::size_t count) {
     std::size_t size = kScanLimit * 4;
-    while (size < entries_.size() * 4) size *= 2;
+    while (size < count * 2) size *= 2;
     slots_.assign(size, Slot{});
     for (std::size_t i = 0; i < entries_.size(); ++i) place(i);
   }
@@ -129,7 +134,7 @@ class OrderedMap {
   }
 
   std::vector<Entry> entries_;
-  std::vector<Slot> slots_;  // empty up to kScanLimit entries; a power of two, at most half full, beyond
+  std::vector<Slot> slots_;  // empty, or a power of two and at most half full; never empty beyond kScanLimit entries
 };
 
 }  // namespace QUAZOR_CONTRACT

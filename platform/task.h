@@ -11,13 +11,15 @@
 
 namespace QUAZOR_CONTRACT {
 
-// A move-only callable without arguments or result. Callables up to kInlineSize bytes that move without throwing are
-// held in place, so that posting them allocates nothing; larger ones are held on the heap.
+// A move-only callable without arguments or result. Callables up to kInlineSize bytes that move without throwing and
+// need no stricter alignment than a pointer are held in place, so that posting them allocates nothing; others are held
+// on the heap.
 //
 // Not synchronised. The callable is destroyed with the Task that holds it.
 class Task {
  public:
   static constexpr std::size_t kInlineSize = 48;
+  static constexpr std::size_t kInlineAlignment = alignof(void*);
 
   Task() = default;
   template <class F>
@@ -64,7 +66,7 @@ class Task {
 
   template <class F>
   static constexpr bool fitsInline() {
-    return sizeof(F) <= kInlineSize && alignof(F) <= alignof(std::max_align_t) &&
+    return sizeof(F) <= kInlineSize && alignof(F) <= kInlineAlignment &&
            std::is_nothrow_move_constructible_v<F>;
   }
 
@@ -87,7 +89,7 @@ class Task {
     if (operations_ != nullptr) operations_->move(other.storage_, storage_);
   }
 
-  alignas(std::max_align_t) std::byte storage_[kInlineSize];
+  alignas(kInlineAlignment) std::byte storage_[kInlineSize];
   const Operations* operations_ = nullptr;
 };
 

@@ -8,6 +8,7 @@
 #include <optional>
 #include <string_view>
 #include <utility>
+#include <vector>
 
 namespace quazor {
 
@@ -221,6 +222,8 @@ std::unique_ptr<QZExperimentResult> QZTesselFaultExperiment::_finish(const Repor
 std::unique_ptr<QZExperimentResult> QZTesselFaultExperiment::_buildResult() const {
   auto result = std::make_unique<QZExperimentResult>();
   OrderedMap<Measurement>& measurements = result->measurements();
+  const std::vector<ReportSample>& samples = _telemonDelta->samples();
+  measurements.reserve(7 + samples.size());
   measurements.set("FrameCount", Measurement(static_cast<double>(_frameCount.load()), QZDimensionlessUnit::frames()));
   if (_errorCounters) {
     const auto setCounter = [&](std::string_view name, std::string_view key) {
@@ -234,7 +237,7 @@ std::unique_ptr<QZExperimentResult> QZTesselFaultExperiment::_buildResult() cons
     setCounter("Projector", "ProjectorErrorCount");
   }
   // A channel may bear one of the names above; its count then stands.
-  for (const ReportSample& sample : _telemonDelta->samples()) {
+  for (const ReportSample& sample : samples) {
     const ReportChannel& channel = sample.channel();
     measurements.set(channel.channelDescription().name,
                      Measurement(toDouble(pointerTo(channel.count())), QZDimensionlessUnit::events()));

@@ -52,6 +52,8 @@ class QZTesselFaultExperiment final : public QZExperiment,
   bool teardown(DiagnosticErrorPtr* error) override;
 
  private:
+  struct Examination;
+
   bool _openStream(DiagnosticErrorPtr* error);
   bool _findStream(const CaptureStreams& streams, DiagnosticErrorPtr* error);
   bool _configureStream(DiagnosticErrorPtr* error);
@@ -69,7 +71,7 @@ class QZTesselFaultExperiment final : public QZExperiment,
   // Any thread.
   void _handleEvent(std::int32_t event, MediaTime time, const Value* info);
   // On the receiving queue.
-  void _takeIn(PixelBuffer& buffer, MediaTime time);
+  static void _takeIn(std::shared_ptr<QZTesselFaultExperiment> self, PixelBuffer& buffer, MediaTime time);
   // On the processing queue.
   void _examine(const QZTesselFrameDescription& frame, std::uint64_t number);
   // Any thread. Ends the stream, the first time it is called; `error` may be null.
@@ -85,6 +87,7 @@ class QZTesselFaultExperiment final : public QZExperiment,
   std::optional<Value> _errorCounters;         // read at the stop; as _error
   std::shared_ptr<const ReportSnapshot> _telemonDelta;
   std::atomic<std::uint64_t> _frameCount{0};  // written on the receiving queue only
+  RecordPool _records;                        // of frames that wait for their examination
   std::shared_ptr<SerialQueue> _receivingQueue;
   std::shared_ptr<SerialQueue> _processingQueue;
   std::recursive_mutex _mutex;     // held for all of _stopWithError

@@ -19,6 +19,16 @@ bool isLit(const QZTesselFrameDescription& frame) {
 
 }  // namespace
 
+// A frame's task on the processing queue. Drops the frame's record before the experiment that the record's memory
+// belongs to.
+struct QZTesselFaultExperiment::Examination {
+  std::shared_ptr<QZTesselFaultExperiment> self;
+  std::shared_ptr<const QZTesselFrameDescription> frame;
+  std::uint64_t number;
+
+  void operator()() { self->_examine(*frame, number); }
+};
+
 Dictionary QZTesselFaultExperiment::_handlers() {
   const std::weak_ptr<QZTesselFaultExperiment> weak = weak_from_this();
   auto frames = std::make_shared<PixelBufferHandler>([weak](PixelBuffer& buffer, MediaTime time) {
@@ -34,7 +44,7 @@ Dictionary QZTesselFaultExperiment::_handlers() {
 
 void QZTesselFaultExperiment::_handlePixelBuffer(PixelBuffer& buffer, MediaTime time) {
   _receivingQueue->async([weak = weak_from_this(), &buffer, time] {
-    if (const auto self = weak.lock()) self->_takeIn(buffer, time);
+    if (auto self = weak.lock()) _takeIn(std::move(self), buffer, time);
   });
 }
 
@@ -46,33 +56,35 @@ void QZTesselFaultExperiment::_handleEvent(std::int32_t event, MediaTime time, c
 
 // The reference that the frame handler took is given back in one place, when the frame is handed on. The paths that end
 // before it keep the buffer, deliberately.
-void QZTesselFaultExperiment::_takeIn(PixelBuffer& buffer, MediaTime time) {
-  if (_stop) {
+void QZTesselFaultExperiment::_takeIn(std::shared_ptr<QZTesselFaultExperiment> self, PixelBuffer& buffer,
+                                      MediaTime time) {
+  if (self->_stop) {
     logDefault("Received frame that won't be counted at time: %@", time.seconds());
     return;
   }
-  const std::uint64_t number = _frameCount.fetch_add(1, std::memory_order_relaxed) + 1;
+  const std::uint64_t number = self->_frameCount.fetch_add(1, std::memory_order_relaxed) + 1;
   logDebug("Received frame %@.", number);
   const std::optional<Value> metadata = buffer.attachment(capture_key::MetadataDictionary);
   if (!metadata) {
-    _stopWithError(makeError(QZCapturePlugInErrorDomain, tessel_fault_error::kBadFrame, "Frame metadata is missing!"));
+    self->_stopWithError(
+        makeError(QZCapturePlugInErrorDomain, tessel_fault_error::kBadFrame, "Frame metadata is missing!"));
     return;
   }
   if (metadata->dictionary() == nullptr) {
-    _stopWithError(
+    self->_stopWithError(
         makeError(QZCapturePlugInErrorDomain, tessel_fault_error::kBadFrame, "Frame metadata is not a dictionary!"));
     return;
   }
-  auto frame =
-      QZTesselFrameDescription::descriptionWithMonotonicCount(number, time, *metadata->dictionary(), *_platform.clock);
+  auto frame = QZTesselFrameDescription::descriptionWithMonotonicCount(number, time, *metadata->dictionary(),
+                                                                       *self->_platform.clock, self->_records);
   if (frame == nullptr) {
-    _stopWithError(makeError(QZCapturePlugInErrorDomain, tessel_fault_error::kBadFrame,
-                             "Could not create a frame description of frame %lu!", number));
+    self->_stopWithError(makeError(QZCapturePlugInErrorDomain, tessel_fault_error::kBadFrame,
+                                   "Could not create a frame description of frame %lu!", number));
     return;
   }
   buffer.release();
-  _processingQueue->async(
-      [self = shared_from_this(), frame = std::move(frame), number] { self->_examine(*frame, number); });
+  SerialQueue& processing = *self->_processingQueue;
+  processing.async(Examination{std::move(self), std::move(frame), number});
 }
 
 void QZTesselFaultExperiment::_examine(const QZTesselFrameDescription& frame, std::uint64_t number) {

@@ -41,27 +41,42 @@ constinit const std::array<std::string_view, QZTesselFrameDescription::kNumberCo
                                             "DIETemperatureActive",
                                             "HardwareEvents"};
 
-QZTesselFrameDescription::QZTesselFrameDescription(const Clock& clock) : _creationDate(clock.date()) {
-  _numbers.fill(Value(0));
+QZTesselFrameDescription::QZTesselFrameDescription(const Clock& clock, Unfilled) : _creationDate(clock.date()) {}
+
+QZTesselFrameDescription::QZTesselFrameDescription(const Clock& clock) : QZTesselFrameDescription(clock, Unfilled()) {
+  for (MetadataNumber& number : _numbers) number.assign(Value(0));
   _numbers[kFloodActiveTemperature].reset();
 }
 
 std::shared_ptr<const QZTesselFrameDescription> QZTesselFrameDescription::descriptionWithMonotonicCount(
     std::uint64_t monotonicCount, MediaTime presenationTime, const Dictionary& metadata, const Clock& clock) {
-  auto record = std::make_shared<QZTesselFrameDescription>(clock);
-  record->_monotonicCount = monotonicCount;
-  record->_presentationTime = presenationTime;
+  auto record = std::make_shared<QZTesselFrameDescription>(clock, Unfilled());
+  return record->fill(monotonicCount, presenationTime, metadata) ? record : nullptr;
+}
+
+std::shared_ptr<const QZTesselFrameDescription> QZTesselFrameDescription::descriptionWithMonotonicCount(
+    std::uint64_t monotonicCount, MediaTime presenationTime, const Dictionary& metadata, const Clock& clock,
+    RecordPool& pool) {
+  auto record =
+      std::allocate_shared<QZTesselFrameDescription>(PoolAllocator<QZTesselFrameDescription>(pool), clock, Unfilled());
+  return record->fill(monotonicCount, presenationTime, metadata) ? record : nullptr;
+}
+
+bool QZTesselFrameDescription::fill(std::uint64_t monotonicCount, MediaTime presentationTime,
+                                    const Dictionary& metadata) {
+  _monotonicCount = monotonicCount;
+  _presentationTime = presentationTime;
   auto next = metadata.begin();  // where the number is when the service lists them in this order, as it mostly does
   for (std::size_t i = 0; i < kNumberCount; ++i) {
     const bool isNext = next != metadata.end() && next->first == kMetadataKeys[i];
     const Value* number = isNext ? &next++->second : metadata.find(kMetadataKeys[i]);
     if (number != nullptr && number->isNumber()) {
-      record->_numbers[i] = *number;
+      _numbers[i].assign(*number);
     } else if (i != kFloodActiveTemperature) {
-      return nullptr;
+      return false;
     }
   }
-  return record;
+  return true;
 }
 
 std::string QZTesselFrameDescription::description() const {

@@ -5,6 +5,8 @@
 #include "platform/clock.h"
 #include "platform/media_time.h"
 #include "platform/platform.h"
+#include "projector_fault/metadata_number.h"
+#include "projector_fault/record_pool.h"
 
 #include <array>
 #include <cstddef>
@@ -12,7 +14,6 @@
 #include <memory>
 #include <optional>
 #include <string>
-#include <utility>
 
 namespace quazor {
 
@@ -22,18 +23,32 @@ namespace quazor {
 // Not synchronised: made on one thread, then read by others, changed by none.
 class QZTesselFrameDescription final : public Object {
  public:
-  // A number of the metadata; absent where it was set to nothing, floodActiveTemperature also where it was never set.
+  // A number of the metadata; absent where it was set to nothing or to what is no number, floodActiveTemperature also
+  // where it was never set.
   using Number = std::optional<Value>;
 
   // A record of defaults: number 0, time 0, made now, floodActiveTemperature absent and all other numbers the integer
   // 0.
   explicit QZTesselFrameDescription(const Clock& clock = *installedPlatform().clock);
 
+  // For the functions below: a record without numbers, which fill() gives it.
+  class Unfilled {
+    friend class QZTesselFrameDescription;
+    Unfilled() = default;
+  };
+  QZTesselFrameDescription(const Clock& clock, Unfilled);
+
   // The record of a frame, or null when a number of the metadata is missing or is no number; floodActiveTemperature
   // alone may be missing.
   static std::shared_ptr<const QZTesselFrameDescription> descriptionWithMonotonicCount(
       std::uint64_t monotonicCount, MediaTime presenationTime, const Dictionary& metadata,
       const Clock& clock = *installedPlatform().clock);
+  // The same, in memory of `pool`, which must outlive it.
+  static std::shared_ptr<const QZTesselFrameDescription> descriptionWithMonotonicCount(std::uint64_t monotonicCount,
+                                                                                       MediaTime presenationTime,
+                                                                                       const Dictionary& metadata,
+                                                                                       const Clock& clock,
+                                                                                       RecordPool& pool);
 
   // The frame's number, from 1.
   std::uint64_t monotonicCount() const { return _monotonicCount; }
@@ -43,44 +58,44 @@ class QZTesselFrameDescription final : public Object {
   Date creationDate() const { return _creationDate; }
   void setCreationDate(Date date) { _creationDate = date; }
 
-  const Number& projectorMode() const { return _numbers[kProjectorMode]; }
-  void setProjectorMode(Number number) { _numbers[kProjectorMode] = std::move(number); }
+  Number projectorMode() const { return _numbers[kProjectorMode].value(); }
+  void setProjectorMode(const Number& number) { set(kProjectorMode, number); }
   // The light source that lit the frame: 1 or 2 when one did.
-  const Number& infraredLightSource() const { return _numbers[kInfraredLightSource]; }
-  void setInfraredLightSource(Number number) { _numbers[kInfraredLightSource] = std::move(number); }
-  const Number& projectorIndex() const { return _numbers[kProjectorIndex]; }
-  void setProjectorIndex(Number number) { _numbers[kProjectorIndex] = std::move(number); }
-  const Number& projectorPowerLow() const { return _numbers[kProjectorPowerLow]; }
-  void setProjectorPowerLow(Number number) { _numbers[kProjectorPowerLow] = std::move(number); }
-  const Number& projectorPowerHigh() const { return _numbers[kProjectorPowerHigh]; }
-  void setProjectorPowerHigh(Number number) { _numbers[kProjectorPowerHigh] = std::move(number); }
-  const Number& projectorPowerFlood() const { return _numbers[kProjectorPowerFlood]; }
-  void setProjectorPowerFlood(Number number) { _numbers[kProjectorPowerFlood] = std::move(number); }
-  const Number& projectorProbeMode() const { return _numbers[kProjectorProbeMode]; }
-  void setProjectorProbeMode(Number number) { _numbers[kProjectorProbeMode] = std::move(number); }
-  const Number& projectorPowerProbeA() const { return _numbers[kProjectorPowerProbeA]; }
-  void setProjectorPowerProbeA(Number number) { _numbers[kProjectorPowerProbeA] = std::move(number); }
-  const Number& projectorPowerProbeB() const { return _numbers[kProjectorPowerProbeB]; }
-  void setProjectorPowerProbeB(Number number) { _numbers[kProjectorPowerProbeB] = std::move(number); }
-  const Number& projectorPulseWidth() const { return _numbers[kProjectorPulseWidth]; }
-  void setProjectorPulseWidth(Number number) { _numbers[kProjectorPulseWidth] = std::move(number); }
-  const Number& floodActiveTemperature() const { return _numbers[kFloodActiveTemperature]; }
-  void setFloodActiveTemperature(Number number) { _numbers[kFloodActiveTemperature] = std::move(number); }
-  const Number& NTCTemperatureIdle() const { return _numbers[kNTCTemperatureIdle]; }
-  void setNTCTemperatureIdle(Number number) { _numbers[kNTCTemperatureIdle] = std::move(number); }
-  const Number& NTCTemperatureStandby() const { return _numbers[kNTCTemperatureStandby]; }
-  void setNTCTemperatureStandby(Number number) { _numbers[kNTCTemperatureStandby] = std::move(number); }
-  const Number& NTCTemperatureActive() const { return _numbers[kNTCTemperatureActive]; }
-  void setNTCTemperatureActive(Number number) { _numbers[kNTCTemperatureActive] = std::move(number); }
-  const Number& DIETemperatureIdle() const { return _numbers[kDIETemperatureIdle]; }
-  void setDIETemperatureIdle(Number number) { _numbers[kDIETemperatureIdle] = std::move(number); }
-  const Number& DIETemperatureStandby() const { return _numbers[kDIETemperatureStandby]; }
-  void setDIETemperatureStandby(Number number) { _numbers[kDIETemperatureStandby] = std::move(number); }
-  const Number& DIETemperatureActive() const { return _numbers[kDIETemperatureActive]; }
-  void setDIETemperatureActive(Number number) { _numbers[kDIETemperatureActive] = std::move(number); }
+  Number infraredLightSource() const { return _numbers[kInfraredLightSource].value(); }
+  void setInfraredLightSource(const Number& number) { set(kInfraredLightSource, number); }
+  Number projectorIndex() const { return _numbers[kProjectorIndex].value(); }
+  void setProjectorIndex(const Number& number) { set(kProjectorIndex, number); }
+  Number projectorPowerLow() const { return _numbers[kProjectorPowerLow].value(); }
+  void setProjectorPowerLow(const Number& number) { set(kProjectorPowerLow, number); }
+  Number projectorPowerHigh() const { return _numbers[kProjectorPowerHigh].value(); }
+  void setProjectorPowerHigh(const Number& number) { set(kProjectorPowerHigh, number); }
+  Number projectorPowerFlood() const { return _numbers[kProjectorPowerFlood].value(); }
+  void setProjectorPowerFlood(const Number& number) { set(kProjectorPowerFlood, number); }
+  Number projectorProbeMode() const { return _numbers[kProjectorProbeMode].value(); }
+  void setProjectorProbeMode(const Number& number) { set(kProjectorProbeMode, number); }
+  Number projectorPowerProbeA() const { return _numbers[kProjectorPowerProbeA].value(); }
+  void setProjectorPowerProbeA(const Number& number) { set(kProjectorPowerProbeA, number); }
+  Number projectorPowerProbeB() const { return _numbers[kProjectorPowerProbeB].value(); }
+  void setProjectorPowerProbeB(const Number& number) { set(kProjectorPowerProbeB, number); }
+  Number projectorPulseWidth() const { return _numbers[kProjectorPulseWidth].value(); }
+  void setProjectorPulseWidth(const Number& number) { set(kProjectorPulseWidth, number); }
+  Number floodActiveTemperature() const { return _numbers[kFloodActiveTemperature].value(); }
+  void setFloodActiveTemperature(const Number& number) { set(kFloodActiveTemperature, number); }
+  Number NTCTemperatureIdle() const { return _numbers[kNTCTemperatureIdle].value(); }
+  void setNTCTemperatureIdle(const Number& number) { set(kNTCTemperatureIdle, number); }
+  Number NTCTemperatureStandby() const { return _numbers[kNTCTemperatureStandby].value(); }
+  void setNTCTemperatureStandby(const Number& number) { set(kNTCTemperatureStandby, number); }
+  Number NTCTemperatureActive() const { return _numbers[kNTCTemperatureActive].value(); }
+  void setNTCTemperatureActive(const Number& number) { set(kNTCTemperatureActive, number); }
+  Number DIETemperatureIdle() const { return _numbers[kDIETemperatureIdle].value(); }
+  void setDIETemperatureIdle(const Number& number) { set(kDIETemperatureIdle, number); }
+  Number DIETemperatureStandby() const { return _numbers[kDIETemperatureStandby].value(); }
+  void setDIETemperatureStandby(const Number& number) { set(kDIETemperatureStandby, number); }
+  Number DIETemperatureActive() const { return _numbers[kDIETemperatureActive].value(); }
+  void setDIETemperatureActive(const Number& number) { set(kDIETemperatureActive, number); }
   // A set of 16 event flags.
-  const Number& hardwareEvents() const { return _numbers[kHardwareEvents]; }
-  void setHardwareEvents(Number number) { _numbers[kHardwareEvents] = std::move(number); }
+  Number hardwareEvents() const { return _numbers[kHardwareEvents].value(); }
+  void setHardwareEvents(const Number& number) { set(kHardwareEvents, number); }
 
   std::string description() const override;
   // The CSV header, 20 titles and a newline. The line's last field, the hardware events, has no title.
@@ -115,10 +130,20 @@ class QZTesselFrameDescription final : public Object {
   };
   static const std::array<std::string_view, kNumberCount> kMetadataKeys;
 
+  void set(NumberIndex index, const Number& number) {
+    if (number) {
+      _numbers[index].assign(*number);
+    } else {
+      _numbers[index].reset();
+    }
+  }
+  // False when a number is missing.
+  bool fill(std::uint64_t monotonicCount, MediaTime presentationTime, const Dictionary& metadata);
+
   std::uint64_t _monotonicCount = 0;
   MediaTime _presentationTime;
   Date _creationDate;
-  std::array<Number, kNumberCount> _numbers;
+  std::array<MetadataNumber, kNumberCount> _numbers;
 };
 
 }  // namespace quazor

@@ -26,8 +26,8 @@ using Record = QZTesselFrameDescription;
 // The numbers of a record, each with its key in the metadata and a value of its own, in the order of the CSV line.
 const struct NumberProperty {
   std::string_view key;
-  const Record::Number& (Record::*get)() const;
-  void (Record::*set)(Record::Number);
+  Record::Number (Record::*get)() const;
+  void (Record::*set)(const Record::Number&);
   int example;
   bool mandatory;
 } kNumbers[] = {
@@ -232,6 +232,16 @@ TEST_F(TesselFrameDescription, SetsOneNumberAtATime) {
     }
     (record.*property.set)(std::nullopt);
     EXPECT_EQ((record.*property.get)(), std::nullopt) << property.key;
+  }
+}
+
+TEST_F(TesselFrameDescription, KeepsTheKindOfEveryNumberAndNothingElse) {
+  for (const Value& number : {Value(true), Value(-1), Value(1U), Value(0.1), Value(36.6F)}) {
+    Record record(clock);
+    record.setHardwareEvents(number);
+    EXPECT_EQ(record.hardwareEvents(), number);
+    record.setHardwareEvents(Value("no number"));
+    EXPECT_EQ(record.hardwareEvents(), std::nullopt);
   }
 }
 

@@ -4,6 +4,7 @@
 
 #include <cstdint>
 #include <utility>
+#include <vector>
 
 namespace quazor {
 
@@ -34,7 +35,9 @@ std::unique_ptr<QZExperimentResult> QZTesselTelemonExperiment::run(DiagnosticErr
     fail(error, QZTelemonErrorDomain, kReportFailure, snapshotError, "Could not sample the report.");
     return nullptr;
   }
-  for (const ReportSample& sample : snapshot->samples()) {
+  const std::vector<ReportSample>& samples = snapshot->samples();
+  result->measurements().reserve(samples.size());
+  for (const ReportSample& sample : samples) {
     const std::string& name = sample.channel().channelDescription().name;
     const std::optional<Value>& count = sample.channel().count();
     if (!count) {

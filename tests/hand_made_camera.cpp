@@ -3,27 +3,34 @@
 #include "platform/capture_keys.h"
 
 #include <cstdint>
+#include <string>
 
 namespace quazor {
 
 namespace {
 
-// The numbers that every frame of the module carries beside its light source and its hardware events.
-constexpr std::array<std::string_view, 15> kPlainNumbers{
-    "MetaDataProjectorMode",        "MetaDataProjectorIndex",       "MetaDataProjectorPowerLow",
-    "MetaDataProjectorPowerHigh",   "MetaDataProjectorPowerFlood",  "MetaDataProjectorProbeMode",
-    "MetaDataProjectorPowerProbeA", "MetaDataProjectorPowerProbeB", "MetaDataProjectorPulseWidth",
-    "NTCTemperatureIdle",           "NTCTemperatureStandby",        "NTCTemperatureActive",
-    "DIETemperatureIdle",           "DIETemperatureStandby",        "DIETemperatureActive"};
 constexpr int kSafetyBit = 0x2000;
 
+// What the module attaches to every frame, in its order.
 Dictionary metadata(int lightSource, int hardwareEvents) {
-  Dictionary numbers;
-  for (std::size_t i = 0; i < kPlainNumbers.size(); ++i) numbers.set(kPlainNumbers[i], static_cast<int>(i));
-  numbers.set(capture_key::InfraredLightSource, lightSource);
-  numbers.set(capture_key::FloodActiveTemperature, 36.5);
-  numbers.set("HardwareEvents", hardwareEvents);
-  return numbers;
+  return Dictionary{{"MetaDataProjectorMode", 0},
+                    {std::string(capture_key::InfraredLightSource), lightSource},
+                    {"MetaDataProjectorIndex", 1},
+                    {"MetaDataProjectorPowerLow", 2},
+                    {"MetaDataProjectorPowerHigh", 3},
+                    {"MetaDataProjectorPowerFlood", 4},
+                    {"MetaDataProjectorProbeMode", 5},
+                    {"MetaDataProjectorPowerProbeA", 6},
+                    {"MetaDataProjectorPowerProbeB", 7},
+                    {"MetaDataProjectorPulseWidth", 8},
+                    {std::string(capture_key::FloodActiveTemperature), 36.5},
+                    {"NTCTemperatureIdle", 9},
+                    {"NTCTemperatureStandby", 10},
+                    {"NTCTemperatureActive", 11},
+                    {"DIETemperatureIdle", 12},
+                    {"DIETemperatureStandby", 13},
+                    {"DIETemperatureActive", 14},
+                    {"HardwareEvents", hardwareEvents}};
 }
 
 Dictionary incompleteMetadata() {
@@ -118,13 +125,13 @@ class HandMadeSnapshot final : public ReportSnapshot {
 
 class HandMadeChannelSet final : public ReportChannelSet {
  public:
-  HandMadeChannelSet(HandMadeReports::Descriptions channels, std::uint64_t growth)
-      : channels_(std::make_shared<const HandMadeReports::Descriptions>(std::move(channels))), growth_(growth) {}
+  HandMadeChannelSet(std::shared_ptr<const HandMadeReports::Descriptions> channels, std::uint64_t growth)
+      : channels_(std::move(channels)), growth_(growth) {}
 
   std::shared_ptr<const ReportChannelSet> reportByFilteringChannels(const Predicate& keep) const override {
-    HandMadeReports::Descriptions kept;
+    auto kept = std::make_shared<HandMadeReports::Descriptions>();
     for (const auto& channel : *channels_) {
-      if (keep(*channel)) kept.push_back(channel);
+      if (keep(*channel)) kept->push_back(channel);
     }
     return std::make_shared<HandMadeChannelSet>(std::move(kept), growth_);
   }
@@ -241,14 +248,15 @@ std::shared_ptr<const ReportChannelSet> HandMadeReports::reportWithOnlySimpleCha
 }
 
 HandMadeReports::Descriptions handMadeChannels(std::size_t count) {
-  HandMadeReports::Descriptions channels;
+  // All in one place, which every pointer to one of them keeps.
+  const auto descriptions = std::make_shared<std::vector<ReportChannelDescription>>();
   for (std::size_t i = 0; i < count; ++i) {
     const std::string name = "Channel " + std::to_string(i);
-    for (const char* subGroup : {"K42ISP Events", "Other Events"}) {
-      channels.push_back(
-          std::make_shared<const ReportChannelDescription>(ReportChannelDescription{"K42ISP", subGroup, name}));
-    }
+    for (const char* subGroup : {"K42ISP Events", "Other Events"}) descriptions->push_back({"K42ISP", subGroup, name});
   }
+  HandMadeReports::Descriptions channels;
+  channels.reserve(descriptions->size());
+  for (const ReportChannelDescription& description : *descriptions) channels.emplace_back(descriptions, &description);
   return channels;
 }
 

@@ -108,12 +108,13 @@ class HandMadeReports final : public ReportFacility {
  public:
   using Descriptions = std::vector<std::shared_ptr<const ReportChannelDescription>>;
 
-  HandMadeReports(Descriptions channels, std::uint64_t growth) : channels_(std::move(channels)), growth_(growth) {}
+  HandMadeReports(Descriptions channels, std::uint64_t growth)
+      : channels_(std::make_shared<const Descriptions>(std::move(channels))), growth_(growth) {}
 
   std::shared_ptr<const ReportChannelSet> reportWithOnlySimpleChannels(DiagnosticErrorPtr* error) override;
 
  private:
-  Descriptions channels_;
+  std::shared_ptr<const Descriptions> channels_;
   std::uint64_t growth_;
 };
 

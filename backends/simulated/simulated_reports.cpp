@@ -39,10 +39,13 @@ class SimulatedReportFacility::Channels {
   Channels(const std::vector<ReportChannelTraits>& traits, std::shared_ptr<CaptureHardware> phone,
            std::shared_ptr<CallInterceptor> interceptor)
       : calls(std::move(interceptor)), hardware_(std::move(phone)) {
+    // The descriptions of all channels lie in one place, which every pointer to one of them keeps.
+    const auto descriptions = std::make_shared<std::vector<ReportChannelDescription>>();
+    descriptions->reserve(traits.size());
     all.reserve(traits.size());
     for (const ReportChannelTraits& channel : traits) {
-      all.push_back({std::make_shared<const ReportChannelDescription>(
-                         ReportChannelDescription{channel.group, channel.subGroup, channel.name}),
+      descriptions->push_back({channel.group, channel.subGroup, channel.name});
+      all.push_back({std::shared_ptr<const ReportChannelDescription>(descriptions, &descriptions->back()),
                      channel.count, channel.growth, channel.steps});
     }
   }

@@ -25,6 +25,7 @@
 #include <atomic>
 #include <cstddef>
 #include <cstdint>
+#include <memory>
 #include <mutex>
 #include <utility>
 
@@ -97,9 +98,16 @@ class TaskList {
   static constexpr std::size_t kSegmentAlignment = 256;
   static_assert((kAsleep | kCountMask) == kSegmentAlignment - 1, "a segment's address and its count share one word");
 
-  // Task ends in padding, where the flag finds room: both together are one cache line.
+  // Holds a task while it is published. One cache line.
   struct alignas(kCacheLine) Slot {
-    [[no_unique_address]] Task task;
+    Slot() {}
+    Slot(const Slot&) = delete;
+    Slot& operator=(const Slot&) = delete;
+    ~Slot() {}
+
+    union {
+      Task task;
+    };
     std::atomic<bool> published{false};
   };
   static_assert(sizeof(Slot) == kCacheLine);
@@ -159,7 +167,7 @@ inline bool TaskList::push(Task&& task) noexcept {
   if (index == kSlots - 1) [[unlikely]]
     linkNextSegment(segment);
   Slot& slot = segment->slots[index];
-  slot.task = std::move(task);
+  std::construct_at(&slot.task, std::move(task));
   slot.published.store(true, std::memory_order_release);
   return (tail & kAsleep) != 0;
 }
@@ -171,7 +179,7 @@ inline Task* TaskList::front() {
 
 inline void TaskList::pop() {
   Slot& slot = head_->slots[consumed_];
-  slot.task.reset();
+  std::destroy_at(&slot.task);
   slot.published.store(false, std::memory_order_relaxed);
   if (++consumed_ == kSlots) [[unlikely]] {
     Segment* const consumed = std::exchange(head_, head_->next);

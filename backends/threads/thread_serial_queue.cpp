@@ -6,6 +6,7 @@
 
 #include <pthread.h>
 #include <sys/resource.h>
+#include <time.h>
 #include <unistd.h>
 
 #include <algorithm>
@@ -19,6 +20,13 @@ namespace quazor {
 namespace {
 
 std::chrono::nanoseconds steadyNow() { return std::chrono::steady_clock::now().time_since_epoch(); }
+
+// At most a tick behind steadyNow(), and a fraction of its price. Both read the same clock (clock_gettime(2)).
+std::chrono::nanoseconds coarseNow() {
+  timespec time{};
+  clock_gettime(CLOCK_MONOTONIC_COARSE, &time);
+  return std::chrono::seconds(time.tv_sec) + std::chrono::nanoseconds(time.tv_nsec);
+}
 
 // The moment `delay` from now, or never when the clock does not reach that far.
 std::chrono::nanoseconds dueAfter(std::chrono::nanoseconds delay) {
@@ -44,17 +52,15 @@ void lowerPriorityOfThisThread() {
 // What the queue and its thread share. The thread holds it until its end.
 class ThreadSerialQueue::Worker {
  public:
-  explicit Worker(QualityOfService quality) : most_polls_(quality == QualityOfService::kBackground ? 0 : kPolls) {}
-
   // Any thread that holds the queue.
-  void post(Task task) {
+  void post(Task&& task) {
     // Whoever posts after a delayed task has become due posts that one first.
     if (delayed_.nextDue() != DelayedTasks::kNever) [[unlikely]]
       postDue();
     push(std::move(task));
   }
 
-  void postAfter(std::chrono::nanoseconds delay, Task task) {
+  void postAfter(std::chrono::nanoseconds delay, Task&& task) {
     if (!delayed_.add(dueAfter(delay), std::move(task))) return;
     if (tasks_.endSleep()) parker_.unpark();  // the thread sleeps until a later moment
   }
@@ -81,6 +87,8 @@ class ThreadSerialQueue::Worker {
   static constexpr int kPolls = 200;
   // So few that they cost nothing, and enough to notice that the next task comes soon again.
   static constexpr int kFewestPolls = 10;
+  // Kernels tick at least 100 times a second.
+  static constexpr std::chrono::nanoseconds kLongestTick = std::chrono::milliseconds(10);
   // Memory that was of no use for so long is given back.
   static constexpr std::chrono::nanoseconds kMemoryPeriod = std::chrono::milliseconds(100);
 
@@ -90,7 +98,8 @@ class ThreadSerialQueue::Worker {
   }
 
   bool postDue() {
-    if (delayed_.nextDue() == DelayedTasks::kNever) return false;
+    const std::chrono::nanoseconds due = delayed_.nextDue();
+    if (due == DelayedTasks::kNever || due - coarseNow() > kLongestTick) return false;
     const std::chrono::nanoseconds now = steadyNow();
     return now >= delayed_.nextDue() && delayed_.postDue(now, [this](Task&& task) { push(std::move(task)); });
   }
@@ -112,11 +121,11 @@ class ThreadSerialQueue::Worker {
     for (int i = 0; i < polls_; ++i) {
       relaxProcessor();
       if (tasks_.front() != nullptr) {
-        polls_ = most_polls_;
+        polls_ = kPolls;
         return true;
       }
     }
-    polls_ = std::min(most_polls_, std::max(kFewestPolls, polls_ / 2));
+    polls_ = std::max(kFewestPolls, polls_ / 2);
     return false;
   }
 
@@ -150,13 +159,12 @@ class ThreadSerialQueue::Worker {
   DelayedTasks delayed_;
   std::atomic<bool> closed_{false};
   // The thread's own.
-  const int most_polls_;
-  int polls_ = most_polls_;
+  int polls_ = kFewestPolls;
   std::chrono::nanoseconds next_tidying_{};
 };
 
 ThreadSerialQueue::ThreadSerialQueue(std::string_view label, QualityOfService quality)
-    : worker_(std::make_shared<Worker>(quality)) {
+    : worker_(std::make_shared<Worker>()) {
   std::thread([worker = worker_, name = std::string(label), quality] {
     nameThisThread(name);
     if (quality == QualityOfService::kBackground) lowerPriorityOfThisThread();
