@@ -66,8 +66,7 @@ class Task {
 
   template <class F>
   static constexpr bool fitsInline() {
-    return sizeof(F) <= kInlineSize && alignof(F) <= kInlineAlignment &&
-           std::is_nothrow_move_constructible_v<F>;
+    return sizeof(F) <= kInlineSize && alignof(F) <= kInlineAlignment && std::is_nothrow_move_constructible_v<F>;
   }
 
   template <class F>
