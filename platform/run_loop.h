@@ -22,7 +22,7 @@ inline constexpr std::string_view kRunLoopCommonModes = "common";
 // What a loop is doing, as bits of an observer's mask.
 using RunLoopActivities = std::uint32_t;
 inline constexpr RunLoopActivities kRunLoopEntry = 0x01;          // a run has begun
-inline constexpr RunLoopActivities kRunLoopBeforeSources = 0x04;  // sources that were signalled are about to be handled
+inline constexpr RunLoopActivities kRunLoopBeforeSources = 0x04;  // sources are signalled and about to be handled
 inline constexpr RunLoopActivities kRunLoopBeforeWaiting = 0x20;  // nothing to do: the thread is about to sleep
 inline constexpr RunLoopActivities kRunLoopAfterWaiting = 0x40;   // the thread was woken, or the time limit came
 inline constexpr RunLoopActivities kRunLoopExit = 0x80;           // the run is over; the last thing it tells
@@ -63,7 +63,9 @@ class QUAZOR_EXPORT RunLoopObserver {
 // Thread: its own, but for stop() and RunLoopSource::signal(), which any thread may call while the loop lives.
 // Handlers: called on the loop's thread, in the loop's run, never before a call that adds them has returned. They may
 //   call everything here, add and remove themselves or others and run the loop again. What is removed is not called
-//   any more, and its handler stays alive until it has returned when it removes itself. They must not throw.
+//   any more, and its handler stays alive until it has returned when it removes itself. What is added is called only
+//   from the next round of sources, or the next activity, on. A handler that runs the loop may be called again in that
+//   run. They must not throw.
 class QUAZOR_EXPORT RunLoop {
  public:
   RunLoop() = default;
@@ -73,7 +75,7 @@ class QUAZOR_EXPORT RunLoop {
 
   // A source that is not yet added; `handler` must not be empty. Sources are handled in the order of their addition.
   virtual std::shared_ptr<RunLoopSource> makeSource(std::function<void()> handler) = 0;
-  // Adding what is there and removing what is not have no effect.
+  // Adding what is there and removing what is not have no effect. `source` was made by this loop.
   virtual void addSource(const std::shared_ptr<RunLoopSource>& source, std::string_view mode) = 0;
   virtual void removeSource(const std::shared_ptr<RunLoopSource>& source, std::string_view mode) = 0;
 
@@ -82,13 +84,14 @@ class QUAZOR_EXPORT RunLoop {
   // just before it is told for the first time.
   virtual std::shared_ptr<RunLoopObserver> makeObserver(RunLoopActivities activities, bool repeats, std::int64_t order,
                                                         std::function<void(RunLoopActivities activity)> handler) = 0;
+  // As for sources.
   virtual void addObserver(const std::shared_ptr<RunLoopObserver>& observer, std::string_view mode) = 0;
   virtual void removeObserver(const std::shared_ptr<RunLoopObserver>& observer, std::string_view mode) = 0;
 
   // Runs until the time limit has come, stop() is called, the mode has no sources left or, when asked, a source was
   // handled. Sources that were signalled before are handled once even when the limit is zero or less; limits beyond
   // the clock's range never come. Every run begins with kRunLoopEntry and ends with kRunLoopExit, also when there is
-  // nothing to wait for. While there is nothing to do the thread sleeps.
+  // nothing to wait for. While there is nothing to do the thread sleeps. Runs may be within runs, in any mode.
   virtual RunLoopResult runInMode(std::string_view mode, std::chrono::nanoseconds limit,
                                   bool returnAfterSourceHandled) = 0;
   // Ends the innermost run that is going on, as soon as the handler that is being called has returned and all sources

@@ -35,6 +35,7 @@ class VirtualScheduler::Flow {
 
   // The call that the task is blocked in; null when it has ended.
   const Wait* wait() const { return wait_; }
+  const std::shared_ptr<Lane>& lane() const { return lane_; }
   // Of a task that has ended: its lane, and what it threw, if it did.
   std::shared_ptr<Lane> takeLane() { return std::exchange(lane_, nullptr); }
   std::exception_ptr takeFailure() { return std::exchange(failure_, nullptr); }
@@ -68,6 +69,10 @@ std::chrono::nanoseconds VirtualScheduler::after(std::chrono::nanoseconds delay)
 }
 
 std::shared_ptr<VirtualScheduler::Lane> VirtualScheduler::makeLane() { return std::make_shared<Lane>(); }
+
+std::shared_ptr<VirtualScheduler::Lane> VirtualScheduler::currentLane() const {
+  return current_ != nullptr ? current_->lane() : nullptr;
+}
 
 void VirtualScheduler::submit(const std::shared_ptr<Lane>& lane, Task task) {
   lane->due.push_back(std::move(task));
@@ -117,6 +122,11 @@ void VirtualScheduler::blockUntil(std::chrono::nanoseconds due, std::string_view
 
 void VirtualScheduler::blockUntil(const std::function<bool()>& condition, std::string_view what) {
   block({condition, kNever, what});
+}
+
+void VirtualScheduler::blockUntil(const std::function<bool()>& condition, std::chrono::nanoseconds due,
+                                  std::string_view what) {
+  block({[this, &condition, due] { return now_ >= due || condition(); }, due, what});
 }
 
 void VirtualScheduler::stall(std::string_view what) const {

@@ -56,6 +56,8 @@ class VirtualScheduler final {
   std::chrono::nanoseconds after(std::chrono::nanoseconds delay) const;
 
   std::shared_ptr<Lane> makeLane();
+  // The lane of the task that is executing; null when it is the main flow.
+  std::shared_ptr<Lane> currentLane() const;
   // Adds a task at the end of the lane.
   void submit(const std::shared_ptr<Lane>& lane, Task task);
   // Adds the task when its time has come, behind those that are waiting then; at once when it has come already.
@@ -74,6 +76,8 @@ class VirtualScheduler final {
   // Throws SimulationStall when nothing is left that could make it hold. On the main flow, also throws whatever a task
   // throws.
   void blockUntil(const std::function<bool()>& condition, std::string_view what);
+  // Blocks until `condition` holds or `due` has come; as above otherwise.
+  void blockUntil(const std::function<bool()>& condition, std::chrono::nanoseconds due, std::string_view what);
 
   // Throws a SimulationStall about `what`, for calls that are never to return.
   [[noreturn]] void stall(std::string_view what) const;

@@ -19,6 +19,7 @@ namespace {
 using namespace std::chrono_literals;
 using ::testing::ElementsAre;
 using ::testing::HasSubstr;
+using ::testing::UnorderedElementsAre;
 using Words = std::vector<std::string>;
 
 // Chooses as told, then always the first; keeps how many things there were to choose from.
@@ -181,6 +182,36 @@ TEST_F(VirtualSchedulerTest, AWaitEndsWhenALaterTaskMakesItsConditionHold) {
   scheduler_.submitAt(7s, lane, [&] { lit = true; });
   scheduler_.blockUntil([&] { return lit; }, "a lamp is to light up");
   EXPECT_EQ(scheduler_.now(), 7s);
+}
+
+TEST_F(VirtualSchedulerTest, AWaitWithADueTimeEndsWhenItsConditionHoldsOrWithTheTime) {
+  bool lit = false;
+  const auto lane = scheduler_.makeLane();
+  scheduler_.submitAt(3s, lane, [&lit] { lit = true; });
+  scheduler_.blockUntil([&lit] { return lit; }, 2s, "a lamp is to light up");
+  EXPECT_EQ(scheduler_.now(), 2s);
+  EXPECT_FALSE(lit);
+  scheduler_.blockUntil([&lit] { return lit; }, 10s, "a lamp is to light up");
+  EXPECT_EQ(scheduler_.now(), 3s);
+  EXPECT_THROW(scheduler_.blockUntil([] { return false; }, VirtualScheduler::kNever, "a lamp is to light up"),
+               SimulationStall);
+}
+
+TEST_F(VirtualSchedulerTest, ATaskIsToldItsLaneAndTheMainFlowHasNone) {
+  const auto first = scheduler_.makeLane();
+  const auto second = scheduler_.makeLane();
+  std::vector<std::shared_ptr<VirtualScheduler::Lane>> lanes;
+  const auto tellLane = [&] { lanes.push_back(scheduler_.currentLane()); };
+  scheduler_.submit(first, [&] {
+    tellLane();
+    scheduler_.blockUntil(1s, "the task");
+    tellLane();
+  });
+  scheduler_.submitAt(1s, second, tellLane);
+  scheduler_.blockUntil(2s, "the test");
+  EXPECT_THAT(lanes, UnorderedElementsAre(first, first, second));
+  EXPECT_EQ(lanes.front(), first);
+  EXPECT_EQ(scheduler_.currentLane(), nullptr);
 }
 
 TEST_F(VirtualSchedulerTest, WhatATaskThrowsComesOutOfTheMainFlowsWaitAndTheLaneGoesOn) {
