@@ -15,6 +15,8 @@ import sys
 
 REPETITIONS = 7
 PEERS = ("asio strand", "asio pool", "tbb node")
+RUN_LOOPS = (("wake_ups", "wake-ups of two threads by each other"), ("signals", "signals from another thread"),
+             ("stopped_runs", "runs that a source stops"))
 LINES = ("received frame", "event", "format index", "device supports", "session status")
 # Two queues that are woken by the same system call differ by less than this, in either direction, from run to run.
 WAKE_UP_NOISE = 1.10
@@ -85,6 +87,15 @@ def check_serial_queue(requirements, medians):
                   f"99th percentile {wake_up(queue, 'p99_ns'):.2f} us")
 
 
+def check_run_loop(requirements, medians):
+    for name, text in RUN_LOOPS:
+        def against_glib(name=name):
+            ours, glib = (medians[f"{name}/{loop}/real_time"]["items_per_second"] / 1e6 for loop in ("quazor", "glib"))
+            return ours >= 1.5 * glib, f"{ours:.3f} against {glib:.3f} million/s"
+
+        requirements.check(f"run loop, {text}: one and a half times GLib", against_glib)
+
+
 def check_log(requirements, medians):
     def disabled():
         line, empty = (medians[f"log/{name}"]["cpu_time"] for name in ("disabled line", "empty call"))
@@ -101,6 +112,17 @@ def check_messages(requirements, medians):
             return ours <= libfmt, f"{ours:.1f} against {libfmt:.1f} ns (with FMT_COMPILE {compiled:.1f})"
 
         requirements.check(f"message \"{name}\": no slower than fmt::format", against_libfmt)
+
+
+def check_sensor_images(requirements, medians):
+    def against_copy():
+        read, copy = (medians[f"record/{name}"]["cpu_time"] for name in ("read", "copy of 384 bytes"))
+        return read <= 3 * copy, f"{read:.1f} against {copy:.1f} ns"
+
+    requirements.check("reading an image record: at most three times a copy of what is kept", against_copy)
+    key = "callback/iterations:10000"
+    if key in medians:
+        print(f"        report callback, until the experiment has its image: {medians[key]['cpu_time']:.1f} ns")
 
 
 def check_load(requirements, medians):
@@ -148,8 +170,10 @@ def main():
     directory, plugin = sys.argv[1:]
     results = (
         (check_serial_queue, run(directory, "serial_queue_benchmark")),
+        (check_run_loop, run(directory, "run_loop_benchmark")),
         (check_log, run(directory, "log_benchmark")),
         (check_messages, run(directory, "message_format_benchmark")),
+        (check_sensor_images, run(directory, "sensor_images_benchmark")),
         (check_load, run(directory, "load_benchmark", plugin, os.path.join(directory, "empty_shared_object.so"))),
         (check_pipeline, run(directory, "projector_pipeline_benchmark")),
         (check_channels, run(directory, "report_channels_benchmark")),
