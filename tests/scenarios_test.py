@@ -1,10 +1,12 @@
 #!/usr/bin/env python3
-"""Runs the diagnostics on every scenario that the project ships and compares the outcome with what the scenario expects.
+"""Runs diagnostics and experiments on every scenario that the project ships and compares the outcome with what the
+scenario expects.
 
-usage: scenarios_test.py PROGRAM SCENARIOS
+usage: scenarios_test.py PROGRAM SCENARIOS PLUGIN
 
-Every scenario must obey the schema and expect an outcome of each diagnostic that it is about, and each of its faults
-must have fired: a run whose fault never fired shows nothing. Exit code 0: all is as expected; 1: something is not.
+PLUGIN registers the experiments that scenarios name. Every scenario must obey the schema and expect an outcome of each
+diagnostic and experiment that it is about, and each of its faults must have fired: a run whose fault never fired shows
+nothing. Exit code 0: all is as expected; 1: something is not.
 """
 
 import concurrent.futures
@@ -44,57 +46,79 @@ def error_of(error):
     return None if error is None else {key: error[key] for key in ("domain", "code", "message")}
 
 
-def differences(expected, diagnostic):
-    """What a diagnostic's outcome has that the scenario did not expect, as sentences."""
-    error = diagnostic["error"]
+def differences(expected, outcome):
+    """What the outcome of a diagnostic or an experiment has that the scenario did not expect, as sentences."""
+    error = outcome["error"]
     if error is not None and error["domain"] == HOST_DOMAIN and "error" not in expected:
         error = None  # the host's own words for a run that gave none
     pairs = {
-        "verdict": (expected["verdict"], diagnostic["verdict"]),
+        "verdict": (expected["verdict"], outcome["verdict"]),
         "error": (expected.get("error"), error_of(error)),
         "failed results": (
             expected.get("failedResults", []),
-            [result["name"] for result in diagnostic["measuredResults"] if result["verdict"] == "fail"],
+            [result["name"] for result in outcome.get("measuredResults", []) if result["verdict"] == "fail"],
         ),
     }
     if "underlying" in expected:
         pairs["underlying error"] = (expected["underlying"], error_of((error or {}).get("underlying-error")))
+    if "images" in expected:
+        pairs["images"] = (expected["images"], len(outcome["auxiliaryData"].get("images", [])))
     return [f"{what}: expected {want}, got {got}" for what, (want, got) in pairs.items() if want != got]
 
 
-def problems(program, file):
-    """Runs the diagnostics that a scenario is about; what is not as expected, as sentences."""
-    expectations = read(file).get("expect", {})
-    if not expectations:
-        return ["it expects nothing"]
-    found = []
-    fired = {}
+def compare(command, expectations, fired):
+    """Runs the program, whose outcomes `expectations` describe by name, and adds to `fired` how often each fault did.
+    What is not as expected, as sentences."""
     run = subprocess.run(
-        [program, "run", *expectations, "--phone", str(file), "--format", "json"],
+        [*command, "--format", "json"],
         stdout=subprocess.PIPE, stderr=subprocess.PIPE, text=True, timeout=60, check=False)
     if run.returncode not in (0, 1, 2):
         return [f"exit code {run.returncode}: {run.stderr}"]
-    diagnostics = {diagnostic["name"]: diagnostic for diagnostic in json.loads(run.stdout)["diagnostics"]}
+    report = json.loads(run.stdout)
+    outcomes = {outcome["name"]: outcome for kind in ("diagnostics", "experiments") for outcome in report.get(kind, [])}
+    found = []
     for name, expected in expectations.items():
-        found += [f"{name}: {difference}" for difference in differences(expected, diagnostics[name])]
-        for number, fault in enumerate(diagnostics[name]["faults"]):
+        found += [f"{name}: {difference}" for difference in differences(expected, outcomes[name])]
+        for number, fault in enumerate(outcomes[name]["faults"]):
             fired[number] = fired.get(number, 0) + fault["fired"]
-    verdicts = {diagnostics[name]["verdict"] for name in expectations}
+    verdicts = {outcomes[name]["verdict"] for name in expectations}
     code = 2 if "error" in verdicts else 1 if "fail" in verdicts else 0
     if run.returncode != code:
         found.append(f"exit code {run.returncode} instead of {code}")
+    return found
+
+
+def problems(program, plugin, file):
+    """Runs what a scenario is about; what is not as expected, as sentences."""
+    expectations = read(file).get("expect", {})
+    if not expectations:
+        return ["it expects nothing"]
+    fired = {}
+    diagnostics = {name: expected for name, expected in expectations.items() if "experiment" not in expected}
+    found = []
+    if diagnostics:
+        found += compare([program, "run", *diagnostics, "--phone", str(file)], diagnostics, fired)
+    for name, expected in expectations.items():
+        if name in diagnostics:
+            continue
+        command = [program, "experiment", expected["experiment"], "--plugin", plugin, "--phone", str(file)]
+        command += ["--profile", "none"]
+        for parameter, value in expected.get("parameters", {}).items():
+            command += ["--set", f"{parameter}={value}"]
+        label = "" if name == expected["experiment"] else f"{name}: "
+        found += [label + sentence for sentence in compare(command, {expected["experiment"]: expected}, fired)]
     found += [f"fault {number} never fired" for number, count in fired.items() if count == 0]
     return found
 
 
 def main():
-    program, folder = sys.argv[1], pathlib.Path(sys.argv[2])
+    program, folder, plugin = sys.argv[1], pathlib.Path(sys.argv[2]), sys.argv[3]
     schema = json.loads((folder / "scenario.schema.json").read_text(encoding="utf-8"))
     validator = jsonschema.Draft202012Validator(schema)
     files = sorted(file for file in folder.rglob("*.json") if file.name != "scenario.schema.json")
     failed = 0
     with concurrent.futures.ThreadPoolExecutor(os.cpu_count()) as pool:
-        for file, found in zip(files, pool.map(lambda file: problems(program, file), files)):
+        for file, found in zip(files, pool.map(lambda file: problems(program, plugin, file), files)):
             content = json.loads(file.read_text(encoding="utf-8"))
             found = [f"schema: {error.message}" for error in validator.iter_errors(content)] + found
             for sentence in found:

@@ -2,6 +2,7 @@
 
 #include "backends/simulated/capture_error.h"
 #include "backends/simulated/report_operations.h"
+#include "backends/simulated/sensor_operations.h"
 
 #include <algorithm>
 
@@ -25,6 +26,10 @@ DiagnosticErrorPtr injectedError(const Fault& fault, const CallSite& site) {
   if (fault.error) return errorWithMessage(fault.error->domain, fault.error->code, fault.error->message, nullptr);
   if (std::ranges::find(kReportOperations, site.operation) != kReportOperations.end()) {
     return makeError(SimulatedReportErrorDomain, static_cast<std::int64_t>(ReportErrorCode::kInjected), "%@ failed.",
+                     nameOf(site));
+  }
+  if (std::ranges::find(kSensorOperations, site.operation, &SensorOperation::name) != kSensorOperations.end()) {
+    return makeError(SimulatedHidErrorDomain, static_cast<std::int64_t>(HidErrorCode::kInjected), "%@ failed.",
                      nameOf(site));
   }
   return makeError(SimulatedCaptureErrorDomain, static_cast<std::int64_t>(CaptureErrorCode::kInjected), "%@ failed.",

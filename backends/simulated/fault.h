@@ -31,8 +31,8 @@ struct FaultError {
 // When several faults take one call, delays add up, and the first of the others in the order of the scenario decides.
 struct Fault {
   std::string operation;                    // such as "CaptureStream.start"; "*" is every operation that can fail
-  std::optional<std::string> object;        // the scenario's id of a camera or a group
-  std::optional<std::string> property;      // the key that the call reads or sets
+  std::optional<std::string> object;        // the scenario's id of a camera, a group or a HID device
+  std::optional<std::string> property;      // the key that the call reads or sets, or a feature report ("0xAB")
   std::optional<std::uint64_t> occurrence;  // the nth call, from 1, among those that the other selectors take
   FaultAction action = FaultAction::kFail;
   std::optional<FaultError> error;  // of kFail

@@ -243,6 +243,7 @@ TEST_F(FrameDeliveryTest, FramesCanBePushed) {
   EXPECT_EQ(phone_->deliverFrames("front", 3), 3U);
   EXPECT_EQ(phone_->deliverFrames("front", 2), 2U);
   EXPECT_THAT(stream_->numbers(), ElementsAre(0, 1, 2, 3, 4));
+  EXPECT_EQ(phone_->framesDelivered(), 5U);
   EXPECT_THAT(phone_->buffersHeld(), IsEmpty());
   stream_->onFrame = [&] { stream_->stop(); };
   EXPECT_EQ(phone_->deliverFrames("front", 9), 1U);

@@ -116,6 +116,12 @@ std::uint64_t JsonCursor::integer(std::uint64_t lowest, std::uint64_t highest) c
   return value_->get<std::uint64_t>();
 }
 
+double JsonCursor::number(double lowest, double highest) const {
+  const bool fits = value_->is_number() && value_->get<double>() >= lowest && value_->get<double>() <= highest;
+  if (!fits) failType("a number from " + Json(lowest).dump() + " to " + Json(highest).dump());
+  return value_->get<double>();
+}
+
 double JsonCursor::positiveNumber(double highest) const {
   const bool fits = value_->is_number() && value_->get<double>() > 0 && value_->get<double>() <= highest;
   if (!fits) failType("a number above 0 and at most " + Json(highest).dump());

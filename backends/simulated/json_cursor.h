@@ -28,6 +28,7 @@ class JsonCursor {
   bool isNull() const { return value_->is_null(); }
   bool isString() const { return value_->is_string(); }
   bool isObject() const { return value_->is_object(); }
+  bool isArray() const { return value_->is_array(); }
 
   // Of objects. `keys` are all the keys there may be.
   void allowKeys(std::initializer_list<std::string_view> keys) const;
@@ -47,6 +48,7 @@ class JsonCursor {
   std::string text() const;
   std::int64_t integer() const;
   std::uint64_t integer(std::uint64_t lowest, std::uint64_t highest) const;
+  double number(double lowest, double highest) const;
   // Above 0.
   double positiveNumber(double highest) const;
   // A number, a boolean or a string; whole numbers are signed integers where they fit one.

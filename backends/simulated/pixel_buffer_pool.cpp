@@ -28,6 +28,7 @@ PixelBuffer& PixelBufferPool::take(std::size_t camera, std::uint64_t frame, std:
   if (free_.empty()) free_.push_back(&buffers_.emplace_back(*this));
   Buffer& buffer = *free_.back();
   free_.pop_back();
+  ++taken_;
   buffer.out_ = true;
   buffer.frame_ = {camera, frame};
   buffer.metadata_ = std::move(metadata);
@@ -41,6 +42,11 @@ void PixelBufferPool::putBack(Buffer& buffer) {
   metadata.swap(buffer.metadata_);
   buffer.out_ = false;
   free_.push_back(&buffer);
+}
+
+std::uint64_t PixelBufferPool::taken() const {
+  const std::lock_guard lock(mutex_);
+  return taken_;
 }
 
 std::vector<PixelBufferPool::Held> PixelBufferPool::held() const {

@@ -38,6 +38,8 @@ class PixelBufferPool final {
   PixelBuffer& take(std::size_t camera, std::uint64_t frame, std::optional<Value> metadata);
   // The buffers that are out, by camera and frame.
   std::vector<Held> held() const;
+  // How many buffers have been handed out in all.
+  std::uint64_t taken() const;
   // How often a buffer was released that nobody held; such a release has no other effect. A release too many of a
   // buffer that is out again by then cannot be told from a rightful one.
   std::uint64_t strayReleases() const { return strayReleases_.load(std::memory_order_relaxed); }
@@ -67,6 +69,7 @@ class PixelBufferPool final {
   mutable std::mutex mutex_;  // guards what follows
   std::deque<Buffer> buffers_;
   std::vector<Buffer*> free_;
+  std::uint64_t taken_ = 0;
 };
 
 }  // namespace quazor

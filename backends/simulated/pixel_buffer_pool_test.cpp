@@ -34,6 +34,14 @@ TEST(PixelBufferPoolTest, HeldBuffersAreToldByCameraAndFrame) {
   EXPECT_THAT(pool.held(), ElementsAre(Held{0, 5}, Held{1, 2}, Held{1, 9}));
 }
 
+TEST(PixelBufferPoolTest, CountsWhatItHasHandedOut) {
+  PixelBufferPool pool;
+  EXPECT_EQ(pool.taken(), 0U);
+  pool.take(0, 0, std::nullopt).release();
+  pool.take(1, 0, std::nullopt);
+  EXPECT_EQ(pool.taken(), 2U);
+}
+
 TEST(PixelBufferPoolTest, BuffersAreUsedAgain) {
   PixelBufferPool pool;
   PixelBuffer& first = pool.take(0, 0, Value("old"));

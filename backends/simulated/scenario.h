@@ -1,8 +1,10 @@
 // Scenario: a whole simulated phone, as data. scenarios/scenario.schema.json describes the files.
 #pragma once
 
+#include "backends/simulated/display_traits.h"
 #include "backends/simulated/fault.h"
 #include "backends/simulated/frame_traits.h"
+#include "backends/simulated/hid_traits.h"
 #include "backends/simulated/report_traits.h"
 #include "frame/ordered_map.h"
 #include "frame/value.h"
@@ -58,10 +60,18 @@ struct CaptureDeviceTraits {
   bool present = true;      // false: the plug-in finds no device
 };
 
-// What a run of a diagnostic on the phone is to end in.
+// An experiment that is run alone.
+struct ExperimentRun {
+  std::string name;
+  OrderedMap<double> parameters;
+  std::optional<std::uint64_t> images;  // how many its result holds; nothing: not looked at
+};
+
+// What a run on the phone is to end in.
 struct Expectation {
   enum class Verdict { kPass, kFail, kError };
 
+  std::optional<ExperimentRun> experiment;  // nothing: a diagnostic is run
   Verdict verdict = Verdict::kPass;
   std::optional<FaultError> error;         // nothing: the run gives no error
   std::optional<FaultError> underlying;    // nothing: that error has no underlying one
@@ -74,8 +84,10 @@ struct Scenario {
   std::vector<Camera> cameras;
   std::vector<CameraGroup> groups;
   std::vector<ReportChannelTraits> reports;
+  std::vector<HidDeviceTraits> hidDevices;
+  DisplayTraits display;
   std::vector<Fault> faults;
-  OrderedMap<Expectation> expectations;  // by the diagnostic's name
+  OrderedMap<Expectation> expectations;  // by the diagnostic's name, or any name of a run of an experiment
 };
 
 // Reads a scenario file and the files it is based on. On failure nothing, and in *problem, unless `problem` is null,

@@ -3,6 +3,9 @@
 #include "backends/simulated/capture_catalogue.h"
 #include "backends/simulated/report_operations.h"
 #include "backends/simulated/scenario_frames.h"
+#include "backends/simulated/scenario_parts.h"
+#include "backends/simulated/scenario_sensors.h"
+#include "backends/simulated/sensor_operations.h"
 
 #include <algorithm>
 #include <array>
@@ -128,11 +131,6 @@ CameraGroup readGroup(const std::string& id, const JsonCursor& cursor, const Sce
   return group;
 }
 
-FaultError readError(const JsonCursor& cursor) {
-  cursor.allowKeys({"domain", "code", "message"});
-  return {cursor.at("domain").text(), cursor.at("code").integer(), cursor.at("message").text()};
-}
-
 // Nothing for an entry that is missing or null.
 std::optional<FaultError> readOptionalError(const JsonCursor& object, std::string_view key) {
   const std::optional<JsonCursor> entry = object.find(key);
@@ -151,6 +149,15 @@ struct Selectable {
     if (!operation.hasProperty) return;
     for (const CaptureProperty& property : propertiesOf(operation.on)) append(properties, {property.key});
   }
+  void add(const SensorOperation& operation, const Scenario& scenario) {
+    for (const HidDeviceTraits& device : scenario.hidDevices) {
+      if (operation.onDevice) append(objects, {device.name});
+      if (operation.property != SensorProperty::kFeatureReport) continue;
+      for (const HidFeatureReport& report : device.featureReports) append(properties, {hidReportName(report.id)});
+    }
+    if (operation.property != SensorProperty::kRegistryProperty) return;
+    for (const auto& [name, value] : scenario.display.properties) append(properties, {name});
+  }
 
  private:
   static void append(Names& to, const Names& names) {
@@ -164,15 +171,19 @@ void readSelectors(const JsonCursor& cursor, const Scenario& scenario, Fault& fa
   Names operations{"*"};
   for (const CaptureOperation& operation : kCaptureOperations) operations.push_back(operation.name);
   operations.insert(operations.end(), kReportOperations.begin(), kReportOperations.end());
+  for (const SensorOperation& operation : kSensorOperations) operations.push_back(operation.name);
   fault.operation = cursor.at("operation").oneOf(operations, "an operation that can fail");
 
   Selectable selectable;
   for (const CaptureOperation& operation : kCaptureOperations) {
     if (fault.operation == "*" || fault.operation == operation.name) selectable.add(operation, scenario);
   }
+  for (const SensorOperation& operation : kSensorOperations) {
+    if (fault.operation == "*" || fault.operation == operation.name) selectable.add(operation, scenario);
+  }
   if (const auto object = cursor.find("object")) {
     if (selectable.objects.empty())
-      object->fail(fault.operation + " is not called on a camera or a group; leave it out.");
+      object->fail(fault.operation + " is not called on a camera, a group or a HID device; leave it out.");
     fault.object = object->oneOf(selectable.objects, "an object of " + fault.operation);
   }
   if (const auto property = cursor.find("property")) {
@@ -205,9 +216,34 @@ Fault readFault(const JsonCursor& cursor, const Scenario& scenario) {
   return fault;
 }
 
+ExperimentRun readExperimentRun(const JsonCursor& cursor) {
+  ExperimentRun run;
+  run.name = cursor.at("experiment").text();
+  if (const auto parameters = cursor.find("parameters")) {
+    constexpr double kHighest = std::numeric_limits<double>::max();
+    for (const auto& [name, value] : parameters->entries()) run.parameters.set(name, value.number(-kHighest, kHighest));
+  }
+  if (const auto images = cursor.find("images")) run.images = images->integer(0, kMostFrames);
+  return run;
+}
+
+void checkExperimentRun(const Expectation& expectation, const JsonCursor& cursor) {
+  if (!expectation.experiment) {
+    if (cursor.find("parameters")) cursor.fail("only a run of an experiment has parameters; name the \"experiment\".");
+    if (cursor.find("images")) cursor.fail("only a run of an experiment has images; name the \"experiment\".");
+    return;
+  }
+  if (expectation.verdict == Expectation::Verdict::kFail) {
+    cursor.fail("nobody judges an experiment that is run alone: it passes or ends in an error.");
+  }
+  if (expectation.experiment->images && expectation.verdict != Expectation::Verdict::kPass) {
+    cursor.fail("only the verdict \"pass\" has images.");
+  }
+}
+
 Expectation readExpectation(const JsonCursor& cursor) {
   constexpr std::array<std::string_view, 3> kVerdicts{"pass", "fail", "error"};
-  cursor.allowKeys({"verdict", "error", "underlying", "failedResults"});
+  cursor.allowKeys({"experiment", "parameters", "verdict", "error", "underlying", "failedResults", "images"});
   Expectation expectation;
   const std::string verdict = cursor.at("verdict").oneOf(kVerdicts, "a verdict");
   if (verdict == "fail") expectation.verdict = Expectation::Verdict::kFail;
@@ -220,13 +256,16 @@ Expectation readExpectation(const JsonCursor& cursor) {
     if (verdict != "fail") results->fail("only the verdict \"fail\" has failed results.");
     for (const JsonCursor& result : results->elements()) expectation.failedResults.push_back(result.text());
   }
+  if (cursor.find("experiment")) expectation.experiment = readExperimentRun(cursor);
+  checkExperimentRun(expectation, cursor);
   return expectation;
 }
 
 }  // namespace
 
 Scenario scenarioOf(const JsonCursor& document) {
-  document.allowKeys({"$schema", "title", "base", "device", "cameras", "groups", "reports", "faults", "expect"});
+  document.allowKeys({"$schema", "title", "base", "device", "cameras", "groups", "reports", "hidDevices", "display",
+                      "faults", "expect"});
   Scenario scenario;
   scenario.title = document.at("title").text();
   if (const auto schema = document.find("$schema")) schema->text();
@@ -238,12 +277,19 @@ Scenario scenarioOf(const JsonCursor& document) {
     scenario.groups.push_back(readGroup(id, group, scenario));
   }
   if (const auto reports = document.find("reports")) scenario.reports = readReports(*reports);
+  if (const auto devices = document.find("hidDevices")) {
+    for (const auto& [name, device] : devices->entries()) {
+      checkId(name, device);
+      scenario.hidDevices.push_back(readHidDevice(name, device));
+    }
+  }
+  if (const auto display = document.find("display")) scenario.display = readDisplay(*display);
   if (const auto faults = document.find("faults")) {
     for (const JsonCursor& fault : faults->elements()) scenario.faults.push_back(readFault(fault, scenario));
   }
   if (const auto expect = document.find("expect")) {
-    for (const auto& [diagnostic, expectation] : expect->entries()) {
-      scenario.expectations.set(diagnostic, readExpectation(expectation));
+    for (const auto& [name, expectation] : expect->entries()) {
+      scenario.expectations.set(name, readExpectation(expectation));
     }
   }
   return scenario;

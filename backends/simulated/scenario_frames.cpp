@@ -1,10 +1,10 @@
 #include "backends/simulated/scenario_frames.h"
 
+#include "backends/simulated/scenario_parts.h"
 #include "platform/clock.h"
 
 #include <algorithm>
 #include <array>
-#include <charconv>
 #include <cstdint>
 #include <limits>
 #include <string>
@@ -34,15 +34,6 @@ void readMetadata(const JsonCursor& cursor, FrameMetadata& metadata) {
   if (const auto without = cursor.find("without")) {
     for (const JsonCursor& key : without->elements()) metadata.without.push_back(key.text());
   }
-}
-
-std::uint64_t readFrameNumber(const std::string& text, const JsonCursor& cursor) {
-  std::uint64_t number = 0;
-  const auto [end, problem] = std::from_chars(text.data(), text.data() + text.size(), number);
-  const bool fits =
-      problem == std::errc() && end == text.data() + text.size() && number <= kMost && text == std::to_string(number);
-  if (!fits) cursor.fail("the key must be the number of a frame, from 0 to " + std::to_string(kMost) + ".");
-  return number;
 }
 
 std::chrono::nanoseconds readTime(const JsonCursor& cursor) {
@@ -85,7 +76,7 @@ Projector readProjector(const JsonCursor& cursor) {
   if (const auto frames = cursor.find("frames")) {
     for (const auto& [number, frame] : frames->entries()) {
       frame.allowKeys({"attachment", "metadata", "without"});
-      readMetadata(frame, projector.frames[readFrameNumber(number, frame)]);
+      readMetadata(frame, projector.frames[readNumberKey(number, "a frame", kMost, frame)]);
     }
   }
   return projector;

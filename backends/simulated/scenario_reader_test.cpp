@@ -238,7 +238,7 @@ TEST_F(ScenarioReaderTest, DocumentsThatMeanNothingAreRefusedWithTheirPath) {
        "p.json: the document: there is no key \"fault\"; did you mean \"faults\"?"},
       {"a key that is far from any", with(R"("zzz": 1)"),
        "p.json: the document: there is no key \"zzz\"; known are \"$schema\", \"title\", \"base\", \"device\", "
-       "\"cameras\", \"groups\", \"reports\", \"faults\", \"expect\"."},
+       "\"cameras\", \"groups\", \"reports\", \"hidDevices\", \"display\", \"faults\", \"expect\"."},
       {"a key twice", with(R"("device": {"present": true, "present": false})"),
        "p.json: device: the key \"present\" stands twice; leave one of the two."},
       {"a key twice at the top", with(R"("title": "again")"),
@@ -338,7 +338,8 @@ TEST_F(ScenarioReaderTest, FaultsThatWouldNeverFireAreRefused) {
        "p.json: faults[0].object: \"g\" is not an object of CaptureStream.start; known are \"a\"."},
       {"an object where there is one only",
        withFault(R"("operation": "CapturePlugIn.device", "object": "a", "action": "fail")"),
-       "p.json: faults[0].object: CapturePlugIn.device is not called on a camera or a group; leave it out."},
+       "p.json: faults[0].object: CapturePlugIn.device is not called on a camera, a group or a HID device; leave it "
+       "out."},
       {"a property that there is not",
        withFault(R"("operation": "CaptureStream.setValue", "property": "FormatIndx", "action": "fail")"),
        "p.json: faults[0].property: \"FormatIndx\" is not a property of CaptureStream.setValue; did you mean "

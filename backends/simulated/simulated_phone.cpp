@@ -1,11 +1,16 @@
 #include "backends/simulated/simulated_phone.h"
 
 #include "backends/simulated/capture_catalogue.h"
+#include "backends/simulated/sensor_operations.h"
 #include "backends/simulated/simulated_capture.h"
+#include "backends/simulated/simulated_framebuffer.h"
+#include "backends/simulated/simulated_hid.h"
 #include "backends/simulated/simulated_reports.h"
+#include "backends/simulated/virtual_run_loop.h"
 #include "backends/simulated/virtual_services.h"
 #include "backends/threads/real_clock.h"
 #include "backends/threads/thread_concurrency.h"
+#include "backends/threads/thread_run_loop.h"
 
 #include <algorithm>
 #include <chrono>
@@ -35,6 +40,23 @@ class ObservedClock final : public Clock {
   const std::shared_ptr<CallInterceptor> calls_;
 };
 
+// The phone's run loops as plug-ins have them: a thread may be made to have none.
+class InterceptedRunLoops final : public RunLoops {
+ public:
+  InterceptedRunLoops(std::shared_ptr<RunLoops> runLoops, std::shared_ptr<CallInterceptor> calls)
+      : runLoops_(std::move(runLoops)), calls_(std::move(calls)) {}
+
+  RunLoop* currentRunLoop() override {
+    return calls_->perform(
+        {sensor_operation::kCurrentRunLoop, {}, {}}, nullptr, [] { return std::string(); },
+        [this] { return runLoops_->currentRunLoop(); });
+  }
+
+ private:
+  const std::shared_ptr<RunLoops> runLoops_;
+  const std::shared_ptr<CallInterceptor> calls_;
+};
+
 CallInterceptor::Hang sleepForEver(std::shared_ptr<Clock> clock) {
   return [clock = std::move(clock)](std::string_view) {
     for (;;) clock->sleep(std::chrono::nanoseconds::max());
@@ -46,7 +68,8 @@ CallInterceptor::Hang sleepForEver(std::shared_ptr<Clock> clock) {
 SimulatedPhone::SimulatedPhone(const Scenario& scenario, PhoneTime time, std::uint64_t seed) {
   if (time == PhoneTime::kReal) {
     auto clock = std::make_shared<RealClock>();
-    build(scenario, clock, std::make_shared<ThreadConcurrency>(), sleepForEver(clock));
+    build(scenario, clock, std::make_shared<ThreadConcurrency>(), std::make_shared<ThreadRunLoops>(),
+          sleepForEver(clock));
   } else {
     buildVirtual(scenario, std::make_shared<VirtualScheduler>(std::make_shared<SeededChooser>(seed)));
   }
@@ -58,7 +81,7 @@ SimulatedPhone::SimulatedPhone(const Scenario& scenario, std::shared_ptr<Virtual
 
 SimulatedPhone::SimulatedPhone(const Scenario& scenario, std::shared_ptr<Clock> clock,
                                std::shared_ptr<Concurrency> concurrency) {
-  build(scenario, clock, std::move(concurrency), sleepForEver(clock));
+  build(scenario, clock, std::move(concurrency), std::make_shared<ThreadRunLoops>(), sleepForEver(clock));
 }
 
 SimulatedPhone::~SimulatedPhone() {
@@ -68,15 +91,20 @@ SimulatedPhone::~SimulatedPhone() {
 void SimulatedPhone::buildVirtual(const Scenario& scenario, std::shared_ptr<VirtualScheduler> scheduler) {
   scheduler_ = std::move(scheduler);
   build(scenario, std::make_shared<VirtualClock>(scheduler_), std::make_shared<VirtualConcurrency>(scheduler_),
+        std::make_shared<VirtualRunLoops>(scheduler_),
         [scheduler = scheduler_](std::string_view what) { scheduler->stall(what); });
 }
 
 void SimulatedPhone::build(const Scenario& scenario, std::shared_ptr<Clock> clock,
-                           std::shared_ptr<Concurrency> concurrency, CallInterceptor::Hang hang) {
+                           std::shared_ptr<Concurrency> concurrency, std::shared_ptr<RunLoops> runLoops,
+                           CallInterceptor::Hang hang) {
   calls_ = std::make_shared<CallInterceptor>(scenario.faults, clock, std::move(hang));
   hardware_ = std::make_shared<CaptureHardware>(scenario, clock, concurrency);
   platform_.capture = std::make_shared<SimulatedCaptureService>(hardware_, calls_);
   platform_.reports = std::make_shared<SimulatedReportFacility>(scenario.reports, hardware_, calls_);
+  platform_.hid = std::make_shared<SimulatedHidService>(scenario.hidDevices, clock, *concurrency, calls_);
+  platform_.framebuffer = std::make_shared<SimulatedFramebufferService>(scenario.display, calls_);
+  platform_.runLoops = std::make_shared<InterceptedRunLoops>(std::move(runLoops), calls_);
   platform_.clock = std::make_shared<ObservedClock>(clock, calls_);
   platform_.concurrency = std::move(concurrency);
 }

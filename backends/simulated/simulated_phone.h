@@ -34,7 +34,7 @@ class SimulatedPhone final {
   SimulatedPhone(const Scenario& scenario, PhoneTime time, std::uint64_t seed);
   // In virtual time, on a scheduler of the caller's choice, so that a test can hand in its own Chooser.
   SimulatedPhone(const Scenario& scenario, std::shared_ptr<VirtualScheduler> scheduler);
-  // On a clock and queues of the caller's choice. A hang sleeps by that clock, for ever.
+  // On a clock and queues of the caller's choice; run loops keep real time. A hang sleeps by that clock, for ever.
   SimulatedPhone(const Scenario& scenario, std::shared_ptr<Clock> clock, std::shared_ptr<Concurrency> concurrency);
   SimulatedPhone(const SimulatedPhone&) = delete;
   SimulatedPhone& operator=(const SimulatedPhone&) = delete;
@@ -61,6 +61,8 @@ class SimulatedPhone final {
     friend bool operator==(const HeldBuffer&, const HeldBuffer&) = default;
   };
   std::vector<HeldBuffer> buffersHeld() const;
+  // How many frames have been handed to handlers, of all cameras; one that is being handled counts.
+  std::uint64_t framesDelivered() const { return hardware_->pool->taken(); }
   // How often a pixel buffer was released that nobody held.
   std::uint64_t strayReleases() const { return hardware_->pool->strayReleases(); }
   // Hands the next `count` frames of the camera's running stream to its handler at once, on this thread, whatever time
@@ -73,7 +75,7 @@ class SimulatedPhone final {
  private:
   void buildVirtual(const Scenario& scenario, std::shared_ptr<VirtualScheduler> scheduler);
   void build(const Scenario& scenario, std::shared_ptr<Clock> clock, std::shared_ptr<Concurrency> concurrency,
-             CallInterceptor::Hang hang);
+             std::shared_ptr<RunLoops> runLoops, CallInterceptor::Hang hang);
 
   std::shared_ptr<VirtualScheduler> scheduler_;
   std::shared_ptr<CallInterceptor> calls_;
