@@ -8,8 +8,78 @@
 #include <fnmatch.h>
 
 #include <algorithm>
+#include <iterator>
+#include <string_view>
+#include <utility>
 
 namespace quazor {
+
+namespace {
+
+std::vector<std::string> diagnosticsWith(const QZLab& lab, const std::string& experiment) {
+  std::vector<std::string> names;
+  for (const QZLab::Registration& one : lab.registrations()) {
+    if (one.kind == QZLab::Kind::kDiagnostic && one.experimentName == experiment) names.push_back(one.name);
+  }
+  return names;
+}
+
+template <class Test>
+std::vector<Diagnostic> thoseThat(const std::vector<Diagnostic>& diagnostics, Test test) {
+  std::vector<Diagnostic> those;
+  std::copy_if(diagnostics.begin(), diagnostics.end(), std::back_inserter(those), test);
+  return those;
+}
+
+bool isWanted(const Diagnostic& one, Wanted wanted) {
+  switch (wanted) {
+    case Wanted::kDiagnostics: return !one.experimentOnly;
+    case Wanted::kExperiments: return one.experimentOnly;
+    case Wanted::kDescribable: break;
+  }
+  return one.usedBy.empty();
+}
+
+// What a name of its own reaches; a pattern that fits nothing else does too.
+std::vector<Diagnostic> reachable(const std::vector<Diagnostic>& catalogue, Wanted wanted) {
+  return wanted == Wanted::kDescribable ? catalogue : allOf(catalogue, wanted);
+}
+
+std::string_view nounOf(Wanted wanted) {
+  switch (wanted) {
+    case Wanted::kDiagnostics: return "diagnostic";
+    case Wanted::kExperiments: return "experiment";
+    case Wanted::kDescribable: break;
+  }
+  return "diagnostic or experiment";
+}
+
+bool contains(const std::vector<Diagnostic>& diagnostics, const Diagnostic& wanted) {
+  return std::any_of(diagnostics.begin(), diagnostics.end(), [&wanted](const Diagnostic& one) {
+    return one.name == wanted.name && one.experimentOnly == wanted.experimentOnly;
+  });
+}
+
+[[noreturn]] void refuseName(const std::vector<Diagnostic>& catalogue, Wanted wanted, const std::string& name) {
+  const std::string quoted = "'" + name + "'";
+  const std::string noun(nounOf(wanted));
+  const auto other = std::find_if(catalogue.begin(), catalogue.end(),
+                                  [&name](const Diagnostic& one) { return matchesName(name, one.name); });
+  if (other != catalogue.end()) {
+    const std::string rest =
+        other->experimentOnly
+            ? "an experiment, which has no limits to be judged by; 'quazor experiment " + other->name + "' runs it"
+            : "a diagnostic; 'quazor run " + other->name + "' runs it, and 'quazor experiment " +
+                  other->experimentName + "' runs its experiment alone";
+    const std::string subject = isPattern(name) ? "no " + noun + " matches " + quoted + ", but " + other->name : quoted;
+    throw Refusal(ExitCode::kUsage, subject + " is " + rest);
+  }
+  if (isPattern(name)) throw Refusal(ExitCode::kUsage, "no " + noun + " matches " + quoted);
+  throw Refusal(ExitCode::kUsage,
+                "there is no " + noun + " " + quoted + didYouMean(name, namesOf(reachable(catalogue, wanted))));
+}
+
+}  // namespace
 
 std::vector<Diagnostic> catalogueOf(const QZLab& lab) {
   std::vector<Diagnostic> catalogue;
@@ -19,6 +89,11 @@ std::vector<Diagnostic> catalogueOf(const QZLab& lab) {
     const QZLab::Registration* analysis = lab.find(QZLab::Kind::kAnalysis, one.analysisName);
     catalogue.push_back({one.name, one.summary, one.experimentName, one.analysisName, experiment->makeExperiment,
                          analysis->makeAnalysis});
+  }
+  for (const QZLab::Registration& one : lab.registrations()) {
+    if (one.kind != QZLab::Kind::kExperiment) continue;
+    catalogue.push_back(
+        {one.name, {}, one.name, {}, one.makeExperiment, nullptr, true, diagnosticsWith(lab, one.name)});
   }
   return catalogue;
 }
@@ -35,7 +110,7 @@ DiagnosticDescription describeDiagnostic(const Diagnostic& diagnostic) {
     description.experiment = experiment->experimentDescription();
     return true;
   });
-  if (description.error != nullptr) return description;
+  if (description.error != nullptr || diagnostic.experimentOnly) return description;
   callPlugin("describing " + diagnostic.analysisName, &description.error, [&](DiagnosticErrorPtr* error) {
     const std::shared_ptr<QZAnalysis> analysis = diagnostic.makeAnalysis();
     if (analysis == nullptr) {
@@ -48,23 +123,24 @@ DiagnosticDescription describeDiagnostic(const Diagnostic& diagnostic) {
   return description;
 }
 
-std::vector<Diagnostic> selectDiagnostics(const std::vector<Diagnostic>& catalogue,
+std::vector<Diagnostic> allOf(const std::vector<Diagnostic>& catalogue, Wanted wanted) {
+  return thoseThat(catalogue, [wanted](const Diagnostic& one) { return isWanted(one, wanted); });
+}
+
+std::vector<Diagnostic> selectDiagnostics(const std::vector<Diagnostic>& catalogue, Wanted wanted,
                                           const std::vector<std::string>& names) {
   std::vector<Diagnostic> selected;
+  const std::vector<Diagnostic> all = allOf(catalogue, wanted);
+  const std::vector<Diagnostic> byName = reachable(catalogue, wanted);
   for (const std::string& name : names) {
-    const bool exact =
-        std::any_of(catalogue.begin(), catalogue.end(), [&name](const Diagnostic& one) { return one.name == name; });
-    bool found = false;
-    for (const Diagnostic& one : catalogue) {
-      if (exact ? one.name != name : !matchesName(name, one.name)) continue;
-      found = true;
-      const bool again = std::any_of(selected.begin(), selected.end(),
-                                     [&one](const Diagnostic& other) { return other.name == one.name; });
-      if (!again) selected.push_back(one);
+    std::vector<Diagnostic> found = thoseThat(byName, [&name](const Diagnostic& one) { return one.name == name; });
+    const auto matches = [&name](const Diagnostic& one) { return matchesName(name, one.name); };
+    if (found.empty()) found = thoseThat(all, matches);
+    if (found.empty()) found = thoseThat(byName, matches);
+    if (found.empty()) refuseName(catalogue, wanted, name);
+    for (Diagnostic& one : found) {
+      if (!contains(selected, one)) selected.push_back(std::move(one));
     }
-    if (found) continue;
-    if (isPattern(name)) throw Refusal(ExitCode::kUsage, "no diagnostic matches '" + name + "'");
-    throw Refusal(ExitCode::kUsage, "there is no diagnostic '" + name + "'" + didYouMean(name, namesOf(catalogue)));
   }
   return selected;
 }

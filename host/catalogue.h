@@ -1,4 +1,4 @@
-// The diagnostics that the loaded plug-ins offer.
+// The diagnostics and experiments that the loaded plug-ins offer.
 #pragma once
 
 #include "frame/lab.h"
@@ -9,7 +9,8 @@
 
 namespace quazor {
 
-// A diagnostic with the factories of its two halves.
+// A diagnostic with the factories of its two halves; or an experiment on its own, whose two names are one and which has
+// neither summary nor analysis.
 struct Diagnostic {
   std::string name;
   std::string summary;
@@ -17,6 +18,8 @@ struct Diagnostic {
   std::string analysisName;
   QZExperimentFactory makeExperiment;
   QZAnalysisFactory makeAnalysis;
+  bool experimentOnly = false;
+  std::vector<std::string> usedBy{};  // of an experiment on its own: the diagnostics that have it, as registered
 };
 
 // What a diagnostic's halves say of themselves.
@@ -26,17 +29,25 @@ struct DiagnosticDescription {
   DiagnosticErrorPtr error;  // why it could not be asked; null when it could
 };
 
-// The lab's diagnostics, in the order of their registration. REQUIRES: their experiments and analyses are registered.
+// What a command's names can stand for. Of the experiments that diagnostics use, kDescribable has those that are asked
+// for by name, or by a pattern that fits nothing else: the diagnostics' descriptions have them already.
+enum class Wanted { kDiagnostics, kExperiments, kDescribable };
+
+// The lab's diagnostics, then all its experiments, each in the order of their registration. REQUIRES: the diagnostics'
+// experiments and analyses are registered.
 std::vector<Diagnostic> catalogueOf(const QZLab& lab);
 
-// Makes an experiment and an analysis to ask for their descriptions, on a platform without a phone. What a plug-in
-// throws ends in `error`.
+// Makes an experiment and, of a diagnostic, an analysis to ask for their descriptions, on a platform without a phone.
+// What a plug-in throws ends in `error`.
 DiagnosticDescription describeDiagnostic(const Diagnostic& diagnostic);
 
-// The diagnostics that `names` ask for, without repetitions, in the order of the names; a name that no diagnostic has
-// is a pattern of the shell's kind (*, ?, [...]) and stands for all that match, in the catalogue's order. Throws a
-// Refusal (kUsage) for a name or pattern that fits none.
-std::vector<Diagnostic> selectDiagnostics(const std::vector<Diagnostic>& catalogue,
+// What there is of the catalogue for everyone who asks for all.
+std::vector<Diagnostic> allOf(const std::vector<Diagnostic>& catalogue, Wanted wanted);
+
+// What `names` ask for, without repetitions, in the order of the names; a name that nothing wanted has is a pattern of
+// the shell's kind (*, ?, [...]) and stands for all that match, in the catalogue's order. Throws a Refusal (kUsage) for
+// a name or pattern that fits nothing wanted; it tells the command to use when there is something else of that name.
+std::vector<Diagnostic> selectDiagnostics(const std::vector<Diagnostic>& catalogue, Wanted wanted,
                                           const std::vector<std::string>& names);
 
 // True when `pattern` is, or matches, `name`.

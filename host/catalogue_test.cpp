@@ -22,16 +22,17 @@ class CatalogueTest : public testing::Test {
     for (const char* name : {"Sync.Back", "Sync.Front", "Fault", "Sy*"}) {
       lab_.addDiagnosticWithName(name, "Summary.", "Experiment", "Analysis");
     }
+    lab_.addExperimentWithName("Image.Alone", [] { return std::make_shared<fake::FakeExperiment>(); });
     catalogue_ = catalogueOf(lab_);
   }
 
-  std::vector<std::string> select(const std::vector<std::string>& names) const {
-    return namesOf(selectDiagnostics(catalogue_, names));
+  std::vector<std::string> select(const std::vector<std::string>& names, Wanted wanted = Wanted::kDiagnostics) const {
+    return namesOf(selectDiagnostics(catalogue_, wanted, names));
   }
 
-  std::string refusalOf(const std::vector<std::string>& names) const {
+  std::string refusalOf(const std::vector<std::string>& names, Wanted wanted = Wanted::kDiagnostics) const {
     try {
-      select(names);
+      select(names, wanted);
     } catch (const Refusal& refusal) {
       EXPECT_EQ(refusal.code(), ExitCode::kUsage);
       return refusal.what();
@@ -43,13 +44,80 @@ class CatalogueTest : public testing::Test {
   std::vector<Diagnostic> catalogue_;
 };
 
-TEST_F(CatalogueTest, HoldsTheDiagnosticsInTheOrderOfTheirRegistration) {
-  EXPECT_THAT(namesOf(catalogue_), ElementsAre("Sync.Back", "Sync.Front", "Fault", "Sy*"));
+TEST_F(CatalogueTest, HoldsDiagnosticsAndThenExperimentsInTheOrderOfTheirRegistration) {
+  EXPECT_THAT(namesOf(catalogue_), ElementsAre("Sync.Back", "Sync.Front", "Fault", "Sy*", "Experiment", "Image.Alone"));
   EXPECT_EQ(catalogue_[0].summary, "Summary.");
   EXPECT_EQ(catalogue_[0].experimentName, "Experiment");
   EXPECT_EQ(catalogue_[0].analysisName, "Analysis");
   EXPECT_NE(catalogue_[0].makeExperiment(), nullptr);
   EXPECT_NE(catalogue_[0].makeAnalysis(), nullptr);
+}
+
+TEST_F(CatalogueTest, KnowsOfAnExperimentWhichDiagnosticsHaveIt) {
+  EXPECT_FALSE(catalogue_[3].experimentOnly);
+  const Diagnostic& used = catalogue_[4];
+  EXPECT_TRUE(used.experimentOnly);
+  EXPECT_EQ(used.experimentName, "Experiment");
+  EXPECT_EQ(used.analysisName, "");
+  EXPECT_NE(used.makeExperiment(), nullptr);
+  EXPECT_THAT(used.usedBy, ElementsAre("Sync.Back", "Sync.Front", "Fault", "Sy*"));
+  EXPECT_TRUE(catalogue_[5].experimentOnly);
+  EXPECT_THAT(catalogue_[5].usedBy, ElementsAre());
+}
+
+TEST_F(CatalogueTest, GivesAllThatIsWanted) {
+  EXPECT_THAT(namesOf(allOf(catalogue_, Wanted::kDiagnostics)), ElementsAre("Sync.Back", "Sync.Front", "Fault", "Sy*"));
+  EXPECT_THAT(namesOf(allOf(catalogue_, Wanted::kExperiments)), ElementsAre("Experiment", "Image.Alone"));
+  EXPECT_THAT(namesOf(allOf(catalogue_, Wanted::kDescribable)),
+              ElementsAre("Sync.Back", "Sync.Front", "Fault", "Sy*", "Image.Alone"));
+}
+
+TEST_F(CatalogueTest, SelectsExperimentsWhereTheyAreWanted) {
+  EXPECT_THAT(select({"*"}, Wanted::kExperiments), ElementsAre("Experiment", "Image.Alone"));
+  EXPECT_THAT(select({"Image.Alone", "Experiment"}, Wanted::kExperiments), ElementsAre("Image.Alone", "Experiment"));
+}
+
+TEST_F(CatalogueTest, SelectsForADescriptionWhatDiagnosticsHaveOnlyWhenItIsMeant) {
+  EXPECT_THAT(select({"*"}, Wanted::kDescribable),
+              ElementsAre("Sync.Back", "Sync.Front", "Fault", "Sy*", "Image.Alone"));
+  EXPECT_THAT(select({"Experiment"}, Wanted::kDescribable), ElementsAre("Experiment"));
+  EXPECT_THAT(select({"Exp*", "Fault"}, Wanted::kDescribable), ElementsAre("Experiment", "Fault"));
+}
+
+TEST_F(CatalogueTest, TakesADiagnosticAndAnExperimentOfOneNameForTwo) {
+  lab_.addExperimentWithName("Fault", [] { return nullptr; });
+  catalogue_ = catalogueOf(lab_);
+  EXPECT_THAT(select({"Fault"}, Wanted::kDescribable), ElementsAre("Fault", "Fault"));
+  EXPECT_FALSE(selectDiagnostics(catalogue_, Wanted::kDiagnostics, {"Fault"})[0].experimentOnly);
+  EXPECT_TRUE(selectDiagnostics(catalogue_, Wanted::kExperiments, {"Fault"})[0].experimentOnly);
+}
+
+TEST_F(CatalogueTest, NamesTheCommandForWhatIsNotWantedHere) {
+  EXPECT_EQ(refusalOf({"Image.Alone"}),
+            "'Image.Alone' is an experiment, which has no limits to be judged by; 'quazor experiment Image.Alone' runs "
+            "it");
+  EXPECT_EQ(refusalOf({"Im*"}),
+            "no diagnostic matches 'Im*', but Image.Alone is an experiment, which has no limits to be judged by; "
+            "'quazor experiment Image.Alone' runs it");
+  EXPECT_EQ(refusalOf({"Sync.Back"}, Wanted::kExperiments),
+            "'Sync.Back' is a diagnostic; 'quazor run Sync.Back' runs it, and 'quazor experiment Experiment' runs its "
+            "experiment alone");
+}
+
+TEST_F(CatalogueTest, RefusesANameInTheWordsOfWhatIsWanted) {
+  EXPECT_EQ(refusalOf({"Experimnet"}, Wanted::kExperiments),
+            "there is no experiment 'Experimnet'; did you mean 'Experiment'?");
+  EXPECT_EQ(refusalOf({"X*"}, Wanted::kExperiments), "no experiment matches 'X*'");
+  EXPECT_EQ(refusalOf({"Experimnet"}, Wanted::kDescribable),
+            "there is no diagnostic or experiment 'Experimnet'; did you mean 'Experiment'?");
+  EXPECT_EQ(refusalOf({"X*"}, Wanted::kDescribable), "no diagnostic or experiment matches 'X*'");
+}
+
+TEST_F(CatalogueTest, DescribesAnExperimentWithoutAnAnalysis) {
+  const DiagnosticDescription description = describeDiagnostic(catalogue_[5]);
+  EXPECT_EQ(description.error, nullptr);
+  EXPECT_EQ(description.experiment.summary(), "Measures what it is told to.");
+  EXPECT_TRUE(description.analysis.parameters().empty());
 }
 
 TEST_F(CatalogueTest, SelectsInTheOrderOfTheNames) {
@@ -91,7 +159,9 @@ TEST_F(CatalogueTest, GivesADescribedExperimentAPlatform) {
   bool complete = false;
   diagnostic.makeExperiment = [&complete] {
     const Platform& platform = installedPlatform();
-    complete = platform.capture != nullptr && platform.clock != nullptr && platform.concurrency != nullptr;
+    complete = platform.capture != nullptr && platform.clock != nullptr && platform.concurrency != nullptr &&
+               platform.reports != nullptr && platform.hid != nullptr && platform.framebuffer != nullptr &&
+               platform.runLoops != nullptr;
     return std::make_shared<fake::FakeExperiment>();
   };
   describeDiagnostic(diagnostic);

@@ -16,7 +16,7 @@ namespace quazor {
 
 namespace {
 
-const std::vector<std::string> kCommands = {"list", "describe", "run"};
+const std::vector<std::string> kCommands = {"list", "describe", "run", "experiment"};
 
 constexpr const char* kExamples = R"(Examples:
   quazor list                                     what there is
@@ -24,12 +24,13 @@ constexpr const char* kExamples = R"(Examples:
   quazor run --all                                all of them, on the healthy phone
   quazor run CameraSyncDiagnostic.Back --set duration=10
   quazor run --all --phone my_phone.json --format json --output report.json
+  quazor experiment CameraSyncExperiment.Back     what it measures, without judging it
 )";
 
 constexpr const char* kExitCodes = R"(Exit codes:
-  0    all diagnostics passed
+  0    all diagnostics passed, all experiments returned a result
   1    a diagnostic failed its limits
-  2    a diagnostic ended in an error
+  2    a diagnostic or experiment ended in an error
   64   the command line is wrong
   66   a plug-in, scenario or profile cannot be read or loaded
   70   quazor itself failed
@@ -58,8 +59,8 @@ void addRepeatable(CLI::App& command, const std::string& name, std::vector<std::
   command.add_option(name, texts, description)->allow_extra_args(false)->type_name(form);
 }
 
-void addNames(CLI::App& command, std::vector<std::string>& names) {
-  command.add_option("NAME", names, "A diagnostic's name, or a pattern (*, ?, [...]) for several")->type_name("");
+void addNames(CLI::App& command, std::vector<std::string>& names, const std::string& whose) {
+  command.add_option("NAME", names, whose + " name, or a pattern (*, ?, [...]) for several")->type_name("");
 }
 
 // CLI11 takes a name that is all in brackets for a list of names; with a mark before it, it stays a pattern.
@@ -82,11 +83,11 @@ void removeMarks(RawOptions& raw) {
   for (std::string* text : {&raw.profile, &raw.phone, &raw.seed, &raw.output}) removeMark(*text);
 }
 
-void addCommonOptions(CLI::App& command, RawOptions& raw) {
+void addCommonOptions(CLI::App& command, RawOptions& raw, const std::string& formats) {
   addRepeatable(command, "--plugin", raw.plugins, "Load this plug-in, not the installed one; may be repeated", "FILE");
-  command.add_option("--format", raw.format, "The form of the report: text (default) or json")
+  command.add_option("--format", raw.format, "The form of the report: text (default)" + formats)
       ->type_name("FORMAT")
-      ->check(CLI::IsMember({"text", "json"}));
+      ->check(CLI::IsMember({"text", "json", "csv"}));
   command.add_option("--output", raw.output, "Write the report to this file")->type_name("FILE");
 }
 
@@ -97,8 +98,8 @@ void addParameterOptions(CLI::App& command, RawOptions& raw) {
                 "[experiment.|analysis.]NAME=VALUE");
 }
 
-void addRunOptions(CLI::App& command, RawOptions& raw) {
-  command.add_flag("--all", raw.all, "Run all diagnostics");
+void addRunOptions(CLI::App& command, RawOptions& raw, const std::string& what) {
+  command.add_flag("--all", raw.all, "Run all " + what);
   command
       .add_option("--phone", raw.phone, "Run on the phone of this scenario: a file, or the name of an installed one")
       ->type_name("FILE");
@@ -139,11 +140,34 @@ void refuseEmpty(const CLI::App& command, const char* option) {
   throw Refusal(ExitCode::kUsage, std::string(option) + ": its value is empty");
 }
 
+Command commandOf(const std::string& name) {
+  if (name == "describe") return Command::kDescribe;
+  if (name == "run") return Command::kRun;
+  return name == "experiment" ? Command::kExperiment : Command::kList;
+}
+
+Format formatOf(const std::string& command, const std::string& text) {
+  if (text == "json") return Format::kJson;
+  if (text == "text") return Format::kText;
+  if (command == "experiment") return Format::kCsv;
+  throw Refusal(ExitCode::kUsage,
+                "--format csv is for 'quazor experiment'; '" + command + "' gives its report as text or json");
+}
+
+// Diagnostics or experiments: either names, or --all.
+void checkNames(const Options& options, const std::string& what) {
+  if (options.names.empty() && !options.all) {
+    throw Refusal(ExitCode::kUsage, "name the " + what + " to run, or give --all; 'quazor list' shows what there is");
+  }
+  if (options.all && !options.names.empty()) {
+    throw Refusal(ExitCode::kUsage, "give either names of " + what + " or --all");
+  }
+}
+
 Options optionsOf(const CLI::App& command, const RawOptions& raw) {
   for (const char* option : {"--plugin", "--output", "--profile", "--phone"}) refuseEmpty(command, option);
   Options options;
-  if (command.get_name() == "describe") options.command = Command::kDescribe;
-  if (command.get_name() == "run") options.command = Command::kRun;
+  options.command = commandOf(command.get_name());
   options.names = raw.names;
   options.all = raw.all;
   options.plugins.assign(raw.plugins.begin(), raw.plugins.end());
@@ -153,14 +177,12 @@ Options optionsOf(const CLI::App& command, const RawOptions& raw) {
   for (const std::string& text : raw.settings) options.settings.push_back(parseSetting(text));
   options.logLevel = logLevelOf(raw.logLevel);
   options.systemLog = raw.systemLog;
-  options.report = {raw.format == "json" ? Format::kJson : Format::kText, raw.output};
+  const bool ofExperiments = options.command == Command::kExperiment;
+  options.report = {formatOf(command.get_name(), raw.format), raw.output, ofExperiments};
   options.withoutProfile = raw.profile == "none";
   if (!options.withoutProfile) options.profile = raw.profile;
-  if (options.command == Command::kRun && options.names.empty() && !options.all) {
-    throw Refusal(ExitCode::kUsage, "name the diagnostics to run, or give --all; 'quazor list' shows what there is");
-  }
-  if (options.all && !options.names.empty()) {
-    throw Refusal(ExitCode::kUsage, "give either names of diagnostics or --all");
+  if (ofExperiments || options.command == Command::kRun) {
+    checkNames(options, ofExperiments ? "experiments" : "diagnostics");
   }
   return options;
 }
@@ -171,7 +193,7 @@ void refuseUnknownCommand(const std::vector<std::string>& arguments) {
   const std::string& word = arguments.front();
   if (std::find(kCommands.begin(), kCommands.end(), word) != kCommands.end()) return;
   throw Refusal(ExitCode::kUsage, "there is no command '" + word + "'" + didYouMean(word, kCommands) +
-                                      "; the commands are list, describe, run");
+                                      "; the commands are list, describe, run, experiment");
 }
 
 void declareCommands(CLI::App& app, RawOptions& raw) {
@@ -179,18 +201,23 @@ void declareCommands(CLI::App& app, RawOptions& raw) {
   app.footer(std::string(kExamples) + "\n" + kExitCodes);
   app.set_version_flag("--version",
                        "quazor " QUAZOR_VERSION ", plug-in contract " + std::to_string(QUAZOR_CONTRACT_VERSION));
-  CLI::App& list = *app.add_subcommand("list", "List the diagnostics");
-  addCommonOptions(list, raw);
-  CLI::App& describe = *app.add_subcommand("describe", "Describe diagnostics and their parameters");
-  addNames(describe, raw.names);
+  CLI::App& list = *app.add_subcommand("list", "List the diagnostics, and the experiments that none of them uses");
+  addCommonOptions(list, raw, " or json");
+  CLI::App& describe = *app.add_subcommand("describe", "Describe diagnostics or experiments, and their parameters");
+  addNames(describe, raw.names, "A diagnostic's or experiment's");
   describe.get_option("NAME")->required();
-  addCommonOptions(describe, raw);
+  addCommonOptions(describe, raw, " or json");
   addParameterOptions(describe, raw);
-  CLI::App& run = *app.add_subcommand("run", "Run diagnostics");
-  addNames(run, raw.names);
-  addRunOptions(run, raw);
-  addCommonOptions(run, raw);
+  CLI::App& run = *app.add_subcommand("run", "Run diagnostics: measure, and judge by limits");
+  addNames(run, raw.names, "A diagnostic's");
+  addRunOptions(run, raw, "diagnostics");
+  addCommonOptions(run, raw, " or json");
   addParameterOptions(run, raw);
+  CLI::App& experiment = *app.add_subcommand("experiment", "Run experiments alone: measure, and judge nothing");
+  addNames(experiment, raw.names, "An experiment's");
+  addRunOptions(experiment, raw, "experiments");
+  addCommonOptions(experiment, raw, ", json or csv");
+  addParameterOptions(experiment, raw);
 }
 
 }  // namespace

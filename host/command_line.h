@@ -15,7 +15,7 @@
 
 namespace quazor {
 
-enum class Command { kList, kDescribe, kRun };
+enum class Command { kList, kDescribe, kRun, kExperiment };
 
 // What a command line asks for. Options that its command does not have keep their defaults.
 struct Options {

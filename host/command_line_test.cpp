@@ -88,6 +88,47 @@ TEST(ParseCommandLine, ReadsEveryOption) {
   EXPECT_EQ(options->profile, "f");
 }
 
+TEST(ParseCommandLine, ReadsTheOptionsOfExperiments) {
+  const std::optional<Options> options =
+      parse({"experiment",   "A",        "B*",  "--plugin", "a.so", "--phone",     "p",
+             "--realtime",   "--seed",   "7",   "--set",    "x=1",  "--log-level", "error",
+             "--system-log", "--format", "csv", "--output", "o",    "--profile",   "f"})
+          .options;
+  ASSERT_TRUE(options);
+  EXPECT_EQ(options->command, Command::kExperiment);
+  EXPECT_THAT(options->names, ElementsAre("A", "B*"));
+  EXPECT_THAT(options->plugins, ElementsAre("a.so"));
+  EXPECT_EQ(options->phone, "p");
+  EXPECT_TRUE(options->realTime);
+  EXPECT_EQ(options->seed, 7U);
+  EXPECT_EQ(options->settings.size(), 1U);
+  EXPECT_EQ(options->logLevel, LogLevel::kError);
+  EXPECT_TRUE(options->systemLog);
+  EXPECT_EQ(options->report.format, Format::kCsv);
+  EXPECT_TRUE(options->report.ofExperiments);
+  EXPECT_EQ(options->report.output, "o");
+  EXPECT_EQ(options->profile, "f");
+  EXPECT_TRUE(parse({"experiment", "--all"}).options->all);
+}
+
+TEST(ParseCommandLine, KnowsItsCommands) {
+  struct Row {
+    std::vector<std::string> arguments;
+    Command command;
+    bool ofExperiments;
+  };
+  const Row rows[] = {{{"list"}, Command::kList, false},
+                      {{"describe", "A"}, Command::kDescribe, false},
+                      {{"run", "A"}, Command::kRun, false},
+                      {{"experiment", "A"}, Command::kExperiment, true}};
+  for (const Row& row : rows) {
+    const std::optional<Options> options = parse(row.arguments).options;
+    ASSERT_TRUE(options) << row.arguments[0];
+    EXPECT_EQ(options->command, row.command) << row.arguments[0];
+    EXPECT_EQ(options->report.ofExperiments, row.ofExperiments) << row.arguments[0];
+  }
+}
+
 TEST(ParseCommandLine, TakesPatternsAsTheyAre) {
   const std::optional<Options> options = parse({"run", "[AB]", "*", "A?"}).options;
   ASSERT_TRUE(options);
@@ -108,9 +149,16 @@ TEST(ParseCommandLine, RefusesWrongUsage) {
   };
   const Row rows[] = {
       {{"rnu"}, "there is no command 'rnu'; did you mean 'run'?"},
-      {{"fly"}, "there is no command 'fly'; the commands are list, describe, run"},
+      {{"fly"}, "there is no command 'fly'; the commands are list, describe, run, experiment"},
       {{"run"}, "name the diagnostics to run, or give --all"},
       {{"run", "A", "--all"}, "either names of diagnostics or --all"},
+      {{"experiment"}, "name the experiments to run, or give --all"},
+      {{"experiment", "A", "--all"}, "either names of experiments or --all"},
+      {{"experiment", "A", "--format", "xml"}, "xml"},
+      {{"run", "A", "--format", "csv"},
+       "--format csv is for 'quazor experiment'; 'run' gives its report as text or json"},
+      {{"list", "--format", "csv"}, "'list' gives its report as text or json"},
+      {{"describe", "A", "--format", "csv"}, "'describe' gives its report as text or json"},
       {{"describe"}, "NAME"},
       {{"list", "A"}, "A"},
       {{"list", "--realtime"}, "--realtime"},

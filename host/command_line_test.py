@@ -3,10 +3,13 @@
 CTest gives the program and the directory of the test plug-ins in the environment.
 """
 
+import csv
+import io
 import json
 import os
 import pathlib
 import pty
+import re
 import signal
 import subprocess
 import tempfile
@@ -16,6 +19,7 @@ import unittest
 PROGRAM = os.environ["QUAZOR_PROGRAM"]
 PLUGINS = pathlib.Path(os.environ["QUAZOR_TEST_PLUGINS"])
 WORKING = str(PLUGINS / "working_plugin.so")
+EXPERIMENTS = str(PLUGINS / "experiments_plugin.so")
 
 SCENARIO = {
     "title": "One camera",
@@ -196,8 +200,9 @@ class PluginTest(CommandLineTest):
                 self.refuse(path, "is a truncated shared object")
 
     def test_a_plugin_of_another_contract_version(self):
+        version = quazor("--version").stdout.split()[-1]
         self.refuse(PLUGINS / "stranger_plugin.so", "was built against version 999 of the plug-in contract",
-                    "this program has version 1", "rebuild the plug-in")
+                    f"this program has version {version};", "rebuild the plug-in")
 
     def test_a_shared_object_that_is_no_plugin(self):
         self.refuse(PLUGINS / "empty_plugin.so", "registers nothing")
@@ -236,6 +241,25 @@ class ListTest(CommandLineTest):
         document = json.loads(self.output.read_text())
         self.assertEqual(document["diagnostics"][0], {"name": "Fake.One", "summary": "Does as it is told.",
                                                       "experiment": "FakeExperiment", "analysis": "FakeAnalysis"})
+        self.assertEqual(document["experiments"], [])
+
+    def test_lists_experiments_that_no_diagnostic_uses(self):
+        result = quazor("list", "--plugin", WORKING, "--plugin", EXPERIMENTS)
+        self.assertEqual(result.returncode, 0, result.stderr)
+        heading = "\n\nExperiments that no diagnostic uses; 'quazor experiment NAME' runs one:\n"
+        before, after = result.stdout.split(heading)
+        self.assertIn("Fake.One", before)
+        self.assertEqual([line.split()[0] for line in after.splitlines()],
+                         ["Alone.Images", "Alone.Counts", "Alone.Nothing"])
+        self.assertRegex(after, r"Alone\.Images +Gives images\.\n")
+        self.assertRegex(after, r"Alone\.Nothing +could not be described: the factory of Alone\.Nothing made nothing\n")
+
+    def test_lists_experiments_as_json(self):
+        document = json.loads(quazor("list", "--plugin", EXPERIMENTS, "--format", "json").stdout)
+        self.assertEqual(document, {"schema": 1, "diagnostics": [], "experiments": [
+            {"name": "Alone.Images", "summary": "Gives images."},
+            {"name": "Alone.Counts", "summary": "Measures what it is told to."},
+            {"name": "Alone.Nothing", "summary": None}]})
 
     def test_an_output_file_that_cannot_be_written(self):
         result = quazor("list", "--plugin", WORKING, "--output", self.directory / "nowhere" / "out")
@@ -258,6 +282,25 @@ class DescribeTest(CommandLineTest):
         self.assertIn("the factory of NoExperiment made nothing", result.stdout)
         self.assertIn("describing ThrowingFactory threw an exception: factory threw", result.stdout)
         self.assertIn("describing UndescribableExperiment threw an exception: description threw", result.stdout)
+
+
+    def test_an_experiment_on_its_own(self):
+        profile = self.write("mine.json", '{"schema": 1, "diagnostics": {}, "experiments": {"Alone.*": {"images": 5}}}')
+        result = quazor("describe", "Alone.Images", "--plugin", EXPERIMENTS, "--profile", profile, "--set", "samples=2")
+        self.assertEqual(result.returncode, 0, result.stderr)
+        self.assertIn("An experiment that no diagnostic uses.", result.stdout)
+        self.assertRegex(result.stdout, r"images +5  profile mine\.json +How many images")
+        self.assertRegex(result.stdout, r"samples +2  command line +How many samples")
+        self.assertNotIn("Analysis", result.stdout)
+
+    def test_an_experiment_of_diagnostics(self):
+        result = quazor("describe", "FakeExperiment", "--plugin", WORKING, "--profile", "none", "--format", "json")
+        self.assertEqual(result.returncode, 0, result.stderr)
+        document = json.loads(result.stdout)
+        self.assertEqual(document["diagnostics"], [])
+        self.assertEqual(document["experiments"][0]["name"], "FakeExperiment")
+        self.assertEqual([one["name"] for one in document["experiments"][0]["parameters"]],
+                         ["duration", "measured", "behaviour"])
 
 
 class RunTest(CommandLineTest):
@@ -395,13 +438,152 @@ class RunTest(CommandLineTest):
         self.assertEqual(self.run_fake("--system-log").stdout, self.run_fake().stdout)
 
 
+class ExperimentTest(CommandLineTest):
+    """quazor experiment: the results of experiments, without an analysis or a judgement."""
+
+    def run_alone(self, *arguments, names=("Alone.Images",), **options):
+        fixed = ["--plugin", EXPERIMENTS, "--phone", self.phone, "--profile", "none"]
+        return quazor("experiment", *names, *fixed, *arguments, **options)
+
+    def run_counts(self, *arguments, **options):
+        return self.run_alone("--set", "duration=2", *arguments, names=["Alone.Counts"], **options)
+
+    def rows(self, *arguments, code=0, **options):
+        """The CSV table's rows, the header first."""
+        result = self.run_alone("--format", "csv", *arguments, **options)
+        self.assertEqual(result.returncode, code, result.stderr)
+        return list(csv.reader(io.StringIO(result.stdout), strict=True))
+
+    def test_measurements_as_a_table_and_auxiliary_data(self):
+        result = self.run_counts("--set", "measured=90")
+        self.assertEqual(result.returncode, 0, result.stderr)
+        self.assertRegex(result.stdout, r"\n  Measurement +Value +Unit\n  Count +90  frames\n\n")
+        self.assertIn("  bytes: 00a5\n  list: (-1, 18446744073709551615, 36.6, 0.1, 1, text)\n", result.stdout)
+        self.assertTrue(result.stdout.endswith("\n  DONE\n\n"))
+
+    def test_images_as_pictures_in_80_columns(self):
+        for locale, full in {"C.UTF-8": "\N{FULL BLOCK}", "C": ":", "xx_XX.UTF-8": ":"}.items():
+            with self.subTest(locale):
+                result = self.run_alone("--set", "images=5", env={"LC_ALL": locale}, encoding="utf-8")
+                self.assertEqual(result.returncode, 0, result.stderr)
+                lines = result.stdout.splitlines()
+                self.assertIn('  pictures 5 of 5: number 4294967294, temperature 36.6, label a, "b"', lines)
+                self.assertEqual(lines.count("    i: 48 samples, min -10, max 37"), 5)
+                self.assertEqual(lines.count("    q: 48 samples, min -47000, max 0"), 5)
+                drawn = [line for line in lines if line.strip(" ") and line.endswith(full)]
+                self.assertEqual(len(drawn), 5 * 4)
+                self.assertLessEqual(max(map(len, lines)), 80)
+                if full == ":":
+                    self.assertTrue(result.stdout.isascii())
+
+    def test_the_json_document(self):
+        result = self.run_alone("--set", "images=2", "--set", "samples=3", "--seed", "9", "--format", "json")
+        self.assertEqual(result.returncode, 0, result.stderr)
+        document = json.loads(result.stdout)
+        self.assertEqual(list(document), ["schema", "experiments"])
+        record, = document["experiments"]
+        self.assertEqual(list(record), ["name", "summary", "verdict", "parameters", "measurements", "auxiliaryData",
+                                        "error", "log", "faults", "seed", "durations"])
+        self.assertEqual((record["name"], record["summary"], record["verdict"]),
+                         ("Alone.Images", "Gives images.", "pass"))
+        self.assertEqual(record["parameters"], {"images": 2, "samples": 3})
+        self.assertEqual(record["auxiliaryData"]["pictures"][1],
+                         {"number": 4294967291, "i": [-10, -9, -8], "q": [0, -1000, -2000], "temperature": 36.6,
+                          "label": 'a, "b"'})
+        self.assertEqual((record["error"], record["faults"], record["seed"]), (None, [], 9))
+        self.assertEqual(record["durations"], {"setup": 0.0, "run": 0.0, "teardown": None})
+
+    def test_a_csv_line_for_each_sample(self):
+        rows = self.rows("--set", "images=2")
+        self.assertEqual(rows[0], ["experiment", "image", "label", "number", "temperature", "sample", "i", "q"])
+        self.assertEqual(len(rows), 1 + 2 * 48)
+        self.assertEqual(rows[1], ["Alone.Images", "1", 'a, "b"', "4294967290", "36.6", "0", "-10", "0"])
+        self.assertEqual(rows[96], ["Alone.Images", "2", 'a, "b"', "4294967291", "36.6", "47", "37", "-47000"])
+
+    def test_a_csv_line_for_each_measurement(self):
+        rows = self.rows("--set", "duration=1", "--set", "measured=2.5", names=["Alone.Counts"])
+        self.assertEqual(rows, [["experiment", "measurement", "value", "unit"],
+                                ["Alone.Counts", "Count", "2.5", "frames"]])
+
+    def test_csv_into_a_file(self):
+        result = self.run_counts("--format", "csv", "--output", self.output)
+        self.assertEqual((result.returncode, result.stdout.splitlines()[0]), (0, "DONE  Alone.Counts"))
+        self.assertEqual(self.output.read_text(),
+                         "experiment,measurement,value,unit\nAlone.Counts,Count,0,frames\n")
+
+    def test_csv_is_for_experiments_only(self):
+        for command in (["run", "Fake.One"], ["list"], ["describe", "Fake.One"]):
+            result = quazor(*command, "--plugin", WORKING, "--format", "csv", "--output", self.output)
+            self.assert_refused(result, 64, "--format csv is for 'quazor experiment'",
+                                f"'{command[0]}' gives its report as text or json")
+
+    def test_an_error_beside_a_csv_table(self):
+        result = self.run_counts("--format", "csv", "--set", "behaviour=5")
+        self.assertEqual((result.returncode, result.stdout), (2, "experiment,measurement,value,unit\n"))
+        self.assertIn("quazor: Alone.Counts ended in an error\n  FakeDomain code 2: run failed\n", result.stderr)
+
+    def test_exceptions_become_errors_with_their_text(self):
+        for behaviour, text in {7: "run of Alone.Counts threw an exception: run threw",
+                                12: "run of Alone.Counts threw something that is not a standard exception",
+                                3: "setup of Alone.Counts threw an exception: setup threw",
+                                10: "teardown of Alone.Counts threw an exception: teardown threw"}.items():
+            with self.subTest(behaviour):
+                result = self.run_counts("--set", f"behaviour={behaviour}")
+                self.assertEqual(result.returncode, 2)
+                self.assertIn(f"\n  ERROR\n    QuazorHostErrorDomain code 2: {text}\n", result.stdout)
+
+    def test_all_and_patterns(self):
+        result = self.run_alone("--all", "--set", "images=0", "--set", "duration=1", names=[])
+        self.assertEqual(result.returncode, 2)
+        self.assertIn("3 experiments: 2 returned a result, 1 ended in an error", result.stdout)
+        result = self.run_alone("--set", "images=0", "--set", "duration=1", names=["Alone.[CI]*"])
+        self.assertEqual(result.returncode, 0, result.stderr)
+        self.assertIn("2 experiments: 2 returned a result, 0 ended in an error", result.stdout)
+
+    def test_an_experiment_of_diagnostics_takes_their_profile_values(self):
+        profile = self.write("mine.json", '{"schema": 1, "diagnostics": {"Fake.*": {"experiment": {"duration": 3}}}}')
+        result = quazor("experiment", "FakeExperiment", "--plugin", WORKING, "--phone", self.phone, "--format", "json",
+                        "--profile", profile)
+        self.assertEqual(result.returncode, 0, result.stderr)
+        record, = json.loads(result.stdout)["experiments"]
+        self.assertEqual((record["parameters"], record["durations"]["run"]), ({"duration": 3}, 3.0))
+
+    def test_what_is_refused(self):
+        def refuse(*texts, plugin=EXPERIMENTS, arguments, code=64):
+            result = quazor(*arguments, "--plugin", plugin, "--phone", self.phone, "--output", self.output)
+            self.assert_refused(result, code, *texts)
+
+        refuse("'Fake.One' is a diagnostic; 'quazor run Fake.One' runs it, and 'quazor experiment FakeExperiment' runs "
+               "its experiment alone", plugin=WORKING, arguments=["experiment", "Fake.One"])
+        refuse("'Alone.Images' is an experiment", "'quazor experiment Alone.Images' runs it",
+               arguments=["run", "Alone.Images"])
+        refuse("the loaded plug-ins have no diagnostic, only experiments; 'quazor experiment --all' runs them",
+               arguments=["run", "--all"])
+        refuse("there is no experiment 'Alone.Image'; did you mean 'Alone.Images'?",
+               arguments=["experiment", "Alone.Image"])
+        refuse("Alone.Images needs the parameter images; give it with --set images=VALUE or in a profile",
+               arguments=["experiment", "Alone.Images", "--profile", "none"])
+        refuse("none of the experiments takes a parameter 'image'; did you mean 'images'?",
+               arguments=["experiment", "Alone.Images", "--set", "image=1"])
+        profile = self.write("mine.json", '{"schema": 1, "diagnostics": {}, "experiments": {"Alone": {"images": 5}}}')
+        refuse("has an entry 'Alone', which fits no experiment", code=66,
+               arguments=["experiment", "Alone.Images", "--profile", profile])
+
+    def test_a_plugin_without_experiments(self):
+        # A plug-in's diagnostics have experiments, so only one that registers analyses alone has none.
+        self.assert_refused(quazor("experiment", "--all", "--plugin", PLUGINS / "analysis_plugin.so"), 64,
+                            "the loaded plug-ins have no experiment")
+        self.assert_refused(quazor("run", "--all", "--plugin", PLUGINS / "analysis_plugin.so", "--phone", self.phone),
+                            64, "the loaded plug-ins have no diagnostic\n")
+
+
 class TerminalTest(CommandLineTest):
-    def run_on_terminal(self, env, *arguments):
+    def run_on_terminal(self, env, *arguments, plugin=WORKING, diagnostic="Fake.One"):
         """What the program writes to a terminal, standard output and error together."""
         environment = {key: value for key, value in os.environ.items() if key != "NO_COLOR"}
         environment.update(env)
         main, other = pty.openpty()
-        command = [PROGRAM, "run", "Fake.One", "--plugin", WORKING, "--phone", str(self.phone), "--profile", "none",
+        command = [PROGRAM, "run", diagnostic, "--plugin", plugin, "--phone", str(self.phone), "--profile", "none",
                    *arguments]
         process = subprocess.Popen(command, stdout=other, stderr=other, env=environment)
         os.close(other)
@@ -434,6 +616,17 @@ class TerminalTest(CommandLineTest):
         slow = self.run_on_terminal({"TERM": "xterm", "NO_COLOR": "1"}, "--realtime", "--set", "duration=0.8")
         self.assertRegex(slow, r"Running Fake\.One: 0\.\d s of 0\.8 s\r\x1b\[K")
         self.assertNotIn("Running", slow.split("\r\033[K")[-1])
+
+    def test_progress_compares_frames_with_the_count_asked_for(self):
+        written = self.run_on_terminal({"TERM": "xterm", "NO_COLOR": "1"}, "--realtime", "--set", "frameCount=25",
+                                       "--set", "timeout=10", plugin=str(PLUGINS / "streaming_plugin.so"),
+                                       diagnostic="Streaming")
+        shown = re.findall(r"Running Streaming: 0\.\d s of 10 s, (\d+) of 25 frames\r\x1b\[K", written)
+        counts = [int(count) for count in shown]
+        self.assertGreaterEqual(len(counts), 2, written)
+        self.assertEqual(counts, sorted(set(counts)))
+        self.assertGreater(counts[0], 0)
+        self.assertLessEqual(counts[-1], 25)
 
 
 class InterruptTest(CommandLineTest):

@@ -33,12 +33,26 @@ std::vector<Diagnostic> loadCatalogue(const Options& options, const Installation
   return catalogueOf(QZLab::defaultLab());
 }
 
-// The selected diagnostics with their parameters; everything that can be wrong with them has been checked, but for
-// required parameters without a value.
+Wanted wantedBy(Command command) {
+  if (command == Command::kRun) return Wanted::kDiagnostics;
+  return command == Command::kExperiment ? Wanted::kExperiments : Wanted::kDescribable;
+}
+
+std::vector<Diagnostic> wantedOf(const std::vector<Diagnostic>& catalogue, const Options& options) {
+  const Wanted wanted = wantedBy(options.command);
+  if (!options.all) return selectDiagnostics(catalogue, wanted, options.names);
+  std::vector<Diagnostic> all = allOf(catalogue, wanted);
+  if (!all.empty()) return all;
+  if (wanted == Wanted::kExperiments) throw Refusal(ExitCode::kUsage, "the loaded plug-ins have no experiment");
+  const std::string hint = catalogue.empty() ? "" : ", only experiments; 'quazor experiment --all' runs them";
+  throw Refusal(ExitCode::kUsage, "the loaded plug-ins have no diagnostic" + hint);
+}
+
+// The selected diagnostics or experiments with their parameters; everything that can be wrong with them has been
+// checked, but for required parameters without a value.
 std::vector<BoundDiagnostic> bindDiagnostics(const Options& options, const Installation& installation) {
   const std::vector<Diagnostic> catalogue = loadCatalogue(options, installation);
-  const std::vector<Diagnostic> wanted = options.all ? catalogue : selectDiagnostics(catalogue, options.names);
-  if (wanted.empty()) throw Refusal(ExitCode::kUsage, "the loaded plug-ins have no diagnostic");
+  const std::vector<Diagnostic> wanted = wantedOf(catalogue, options);
   std::vector<DescribedDiagnostic> described;
   described.reserve(catalogue.size());
   for (const Diagnostic& one : catalogue) described.push_back({one, describeDiagnostic(one)});
@@ -53,7 +67,8 @@ std::vector<BoundDiagnostic> bindDiagnostics(const Options& options, const Insta
   std::vector<DescribedDiagnostic> selected;
   for (const Diagnostic& one : wanted) {
     for (const DescribedDiagnostic& candidate : described) {
-      if (candidate.diagnostic.name == one.name) selected.push_back(candidate);
+      const Diagnostic& other = candidate.diagnostic;
+      if (other.name == one.name && other.experimentOnly == one.experimentOnly) selected.push_back(candidate);
     }
   }
   checkSettings(options.settings, selected);
@@ -79,11 +94,14 @@ ExitCode writeAnswer(const Options& options, Console& console, const std::string
 }
 
 ExitCode list(const Options& options, const Installation& installation, Console& console) {
-  const std::vector<Diagnostic> catalogue = loadCatalogue(options, installation);
-  if (options.report.format == Format::kJson)
-    return writeAnswer(options, console, documentText(listDocument(catalogue)));
+  std::vector<DescribedDiagnostic> listed;
+  for (const Diagnostic& one : allOf(loadCatalogue(options, installation), Wanted::kDescribable)) {
+    // A diagnostic's summary is known without making anything of it.
+    listed.push_back({one, one.experimentOnly ? describeDiagnostic(one) : DiagnosticDescription()});
+  }
+  if (options.report.format == Format::kJson) return writeAnswer(options, console, documentText(listDocument(listed)));
   std::ostringstream text;
-  printList(text, catalogue);
+  printList(text, listed);
   return writeAnswer(options, console, text.str());
 }
 
@@ -119,6 +137,9 @@ RunOptions runOptionsOf(const Options& options, const Installation& installation
     if (system != nullptr) listeners.push_back({system, kept});
     return listeners;
   };
+  runOptions.watchPhone = [&progress](const std::shared_ptr<const Phone>& phone) {
+    progress.countFrames([phone] { return phone->framesDelivered(); });
+  };
   return runOptions;
 }
 
@@ -146,7 +167,8 @@ ExitCode runProgram(const std::vector<std::string>& arguments, const Installatio
     switch (options->command) {
       case Command::kList: return list(*options, installation, console);
       case Command::kDescribe: return describe(*options, installation, console);
-      case Command::kRun: return run(*options, installation, console);
+      case Command::kRun:
+      case Command::kExperiment: return run(*options, installation, console);
     }
   } catch (const Refusal& refusal) {
     console.err << "quazor: " << printable(refusal.what()) << '\n';

@@ -23,6 +23,10 @@ class Run {
     if (result == nullptr) return;
     record_.measurements = result->measurements();
     record_.auxiliaryData = result->auxiliaryData();
+    if (diagnostic_.experimentOnly) {
+      record_.verdict = record_.error == nullptr ? Verdict::kPass : Verdict::kError;
+      return;
+    }
     const std::unique_ptr<QZAnalysisResult> analysed = analysis(*result);
     if (analysed == nullptr) return;
     judgeResults(analysed->measuredResults());
@@ -132,13 +136,15 @@ DiagnosticRecord runDiagnostic(const DescribedDiagnostic& diagnostic, const Boun
                                const RunOptions& options) {
   DiagnosticRecord record;
   record.name = diagnostic.diagnostic.name;
-  record.summary = diagnostic.diagnostic.summary;
+  record.summary = diagnostic.summary();
+  record.experimentOnly = diagnostic.diagnostic.experimentOnly;
   record.parameters = parameters;
   record.seed = options.seed;
   record.error = diagnostic.description.error;
   if (record.error != nullptr) return record;
 
-  const std::unique_ptr<Phone> phone = options.makePhone();
+  const std::shared_ptr<const Phone> phone = options.makePhone();
+  if (options.watchPhone) options.watchPhone(phone);
   const Platform platform = phone->platform();
   std::vector<RunLog::Listener> listeners;
   if (options.makeListeners) listeners = options.makeListeners(platform.clock);

@@ -1,4 +1,4 @@
-// Running one diagnostic, from the making of its experiment to its verdict.
+// Running one diagnostic, from the making of its experiment to its verdict; or an experiment on its own.
 #pragma once
 
 #include "frame/host_records.h"
@@ -30,8 +30,10 @@ struct StageDurations {
   std::optional<std::chrono::nanoseconds> analysis;  // the analysis' setup and its analyzing
 };
 
-// All that is known of one run.
+// All that is known of one run. Of an experiment on its own nothing is judged: it has no measured results, and kPass
+// says that it returned a result.
 struct DiagnosticRecord {
+  bool experimentOnly = false;
   std::string name;
   std::string summary;
   Verdict verdict = Verdict::kError;
@@ -52,13 +54,16 @@ struct RunOptions {
   LogLevel logLevel = LogLevel::kDefault;
   // The log back-ends that listen to a run, made for each run from the phone's clock; may be empty.
   std::function<std::vector<RunLog::Listener>(const std::shared_ptr<Clock>&)> makeListeners;
+  // Gets each run's phone before anything happens on it, and may keep it; may be empty.
+  std::function<void(const std::shared_ptr<const Phone>&)> watchPhone;
 };
 
 // Runs the diagnostic on a phone of its own. The calling thread is the one that the plug-in is called on, and it blocks
 // until the run is over. A diagnostic that could not be described is not run: its record holds that error.
 //
 // A stage that fails, gives nothing or throws ends the run with kError, but for a teardown: that one follows on every
-// setup that succeeded, and after one that failed the analysis still takes place, for what it shows.
+// setup that succeeded, and after one that failed the analysis still takes place, for what it shows. An experiment on
+// its own ends with its teardown.
 DiagnosticRecord runDiagnostic(const DescribedDiagnostic& diagnostic, const BoundParameters& parameters,
                                const RunOptions& options);
 

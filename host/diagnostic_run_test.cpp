@@ -38,6 +38,7 @@ class TestPhone final : public Phone {
     return platform;
   }
   std::vector<DeclaredFault> faults() const override { return {{{{"operation", "x"}}, 3}}; }
+  std::uint64_t framesDelivered() const override { return 17; }
 
  private:
   std::shared_ptr<Clock> clock_ = std::make_shared<ManualClock>();
@@ -144,6 +145,80 @@ TEST_F(DiagnosticRunTest, ClosesTheLogAfterwards) {
   EXPECT_FALSE(LogChannel::isEnabled(LogLevel::kError));
 }
 
+TEST_F(DiagnosticRunTest, LetsThePhoneOfARunBeWatched) {
+  std::shared_ptr<const Phone> watched;
+  options_.watchPhone = [&](const std::shared_ptr<const Phone>& phone) {
+    EXPECT_EQ(phonesMade_, 1);
+    watched = phone;
+  };
+  run();
+  ASSERT_NE(watched, nullptr);
+  EXPECT_EQ(watched->framesDelivered(), 17U);
+}
+
+class ExperimentRunTest : public DiagnosticRunTest {
+ protected:
+  ExperimentRunTest() {
+    diagnostic_.diagnostic.name = "FakeExperiment";
+    diagnostic_.diagnostic.summary.clear();
+    diagnostic_.diagnostic.experimentOnly = true;
+    diagnostic_.diagnostic.analysisName.clear();
+    diagnostic_.diagnostic.makeAnalysis = nullptr;
+  }
+
+  DiagnosticRecord runAlone(Behaviour behaviour) {
+    return run({"duration=2", "measured=90", "behaviour=" + std::to_string(static_cast<int>(behaviour))});
+  }
+};
+
+TEST_F(ExperimentRunTest, RecordsWhatAnExperimentMeasuresAndJudgesNothing) {
+  const DiagnosticRecord record = runAlone(Behaviour::kNormal);
+  EXPECT_TRUE(record.experimentOnly);
+  EXPECT_EQ(record.name, "FakeExperiment");
+  EXPECT_EQ(record.summary, "Measures what it is told to.");
+  EXPECT_EQ(record.verdict, Verdict::kPass);
+  EXPECT_EQ(record.error, nullptr);
+  EXPECT_EQ(*record.measurements.find("Count"), Measurement(90, QZDimensionlessUnit::frames()));
+  EXPECT_TRUE(record.auxiliaryData.contains("list"));
+  EXPECT_TRUE(record.measuredResults.empty());
+  EXPECT_EQ(record.durations.run, 2s);
+  EXPECT_EQ(record.durations.teardown, 0ns);
+  EXPECT_EQ(record.durations.analysis, std::nullopt);
+  EXPECT_EQ(record.faults.size(), 1U);
+}
+
+TEST_F(ExperimentRunTest, TakesAnyNumberForAResult) {
+  EXPECT_EQ(run({"duration=2", "measured=-1"}).verdict, Verdict::kPass);
+  EXPECT_EQ(runAlone(Behaviour::kNotANumber).verdict, Verdict::kPass);
+  EXPECT_EQ(runAlone(Behaviour::kRunSucceedsWithError).verdict, Verdict::kPass);
+}
+
+TEST_F(ExperimentRunTest, EndsInTheErrorOfTheStageThatFails) {
+  struct Row {
+    const char* name;
+    Behaviour behaviour;
+    const char* error;
+    std::size_t measurements;
+  };
+  constexpr Row kRows[] = {
+      {"setup fails", Behaviour::kSetupFails, "FakeDomain 1 setup failed", 0},
+      {"run fails", Behaviour::kRunFails, "FakeDomain 2 run failed", 0},
+      {"run fails without an error", Behaviour::kRunFailsWithoutError,
+       "QuazorHostErrorDomain 1 run of FakeExperiment failed without giving an error", 0},
+      {"run throws", Behaviour::kRunThrows,
+       "QuazorHostErrorDomain 2 run of FakeExperiment threw an exception: run threw", 0},
+      {"run throws an integer", Behaviour::kRunThrowsAnInteger,
+       "QuazorHostErrorDomain 2 run of FakeExperiment threw something that is not a standard exception", 0},
+      {"teardown fails", Behaviour::kTeardownFails, "FakeDomain 4 teardown failed", 1},
+  };
+  for (const Row& row : kRows) {
+    const DiagnosticRecord record = runAlone(row.behaviour);
+    EXPECT_EQ(record.verdict, Verdict::kError) << row.name;
+    EXPECT_EQ(textOf(record.error), row.error) << row.name;
+    EXPECT_EQ(record.measurements.size(), row.measurements) << row.name;
+  }
+}
+
 TEST_F(DiagnosticRunTest, MakesAPhoneForEveryRun) {
   run();
   run();
@@ -187,6 +262,8 @@ constexpr FailureRow kFailures[] = {
      "QuazorHostErrorDomain 1 run of FakeExperiment failed without giving an error", "srt", 0},
     {"RunThrows", Behaviour::kRunThrows, "QuazorHostErrorDomain 2 run of FakeExperiment threw an exception: run threw",
      "srt", 0},
+    {"RunThrowsAnInteger", Behaviour::kRunThrowsAnInteger,
+     "QuazorHostErrorDomain 2 run of FakeExperiment threw something that is not a standard exception", "srt", 0},
     {"TeardownFails", Behaviour::kTeardownFails, "FakeDomain 4 teardown failed", "srta", 2},
     {"TeardownThrows", Behaviour::kTeardownThrows,
      "QuazorHostErrorDomain 2 teardown of FakeExperiment threw an exception: teardown threw", "srta", 2},

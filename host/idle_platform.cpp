@@ -44,6 +44,21 @@ class IdleConcurrency final : public Concurrency {
   std::shared_ptr<Semaphore> makeSemaphore(long /*count*/) override { return std::make_shared<OpenSemaphore>(); }
 };
 
+class NoHid final : public HidService {
+ public:
+  std::shared_ptr<HidManager> createManager() override { return nullptr; }
+};
+
+class NoFramebuffer final : public FramebufferService {
+ public:
+  std::shared_ptr<Display> mainDisplay() override { return nullptr; }
+};
+
+class NoRunLoops final : public RunLoops {
+ public:
+  RunLoop* currentRunLoop() override { return nullptr; }
+};
+
 }  // namespace
 
 Platform idlePlatform() {
@@ -52,6 +67,9 @@ Platform idlePlatform() {
   platform.clock = std::make_shared<StoppedClock>();
   platform.concurrency = std::make_shared<IdleConcurrency>();
   platform.reports = std::make_shared<NoReports>();
+  platform.hid = std::make_shared<NoHid>();
+  platform.framebuffer = std::make_shared<NoFramebuffer>();
+  platform.runLoops = std::make_shared<NoRunLoops>();
   return platform;
 }
 

@@ -5,8 +5,8 @@
 
 namespace quazor {
 
-// Services without anything behind them: there is no capture plug-in and no report channel, the clock stands at zero,
-// queues destroy their tasks without running them, and nothing ever blocks.
+// Services without anything behind them: there is no capture plug-in, no report channel, no HID facility, no display
+// and no run loop, the clock stands at zero, queues destroy their tasks without running them, and nothing ever blocks.
 Platform idlePlatform();
 
 }  // namespace quazor

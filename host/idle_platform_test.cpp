@@ -12,6 +12,9 @@ TEST(IdlePlatform, HasEveryServiceAndNothingBehindIt) {
   EXPECT_EQ(platform.capture->createPlugIn(), nullptr);
   EXPECT_EQ(platform.capture->defaultPlugIn(), nullptr);
   EXPECT_EQ(platform.reports->reportWithOnlySimpleChannels(nullptr), nullptr);
+  EXPECT_EQ(platform.hid->createManager(), nullptr);
+  EXPECT_EQ(platform.framebuffer->mainDisplay(), nullptr);
+  EXPECT_EQ(platform.runLoops->currentRunLoop(), nullptr);
 }
 
 TEST(IdlePlatform, NeverBlocks) {
@@ -19,7 +22,9 @@ TEST(IdlePlatform, NeverBlocks) {
   platform.clock->sleep(std::chrono::hours(1));
   EXPECT_EQ(platform.clock->now(), 0ns);
   EXPECT_EQ(platform.clock->date(), Date());
-  platform.concurrency->makeSemaphore(0)->wait();
+  const std::shared_ptr<Semaphore> semaphore = platform.concurrency->makeSemaphore(0);
+  semaphore->wait();
+  semaphore->signal();
 }
 
 TEST(IdlePlatform, DestroysTasksWithoutRunningThem) {

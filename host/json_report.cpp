@@ -12,7 +12,13 @@ namespace {
 
 constexpr int kSchema = 1;
 
-Json documentOf(Json diagnostics) { return {{"schema", kSchema}, {"diagnostics", std::move(diagnostics)}}; }
+Json documentOf(const char* key, Json records) { return {{"schema", kSchema}, {key, std::move(records)}}; }
+
+Json runDocumentOf(const char* key, Json records, const std::optional<std::string>& interrupted) {
+  Json document = documentOf(key, std::move(records));
+  if (interrupted) document["interrupted"] = *interrupted;
+  return document;
+}
 
 Json boundJson(const std::shared_ptr<const QZBound>& bound) {
   if (bound == nullptr) return {};
@@ -108,37 +114,73 @@ Json recordJson(const DiagnosticRecord& record) {
             {"analysis", durationJson(durations.analysis)}}}};
 }
 
+Json experimentJson(const DiagnosticRecord& record) {
+  const StageDurations& durations = record.durations;
+  return {{"name", record.name},
+          {"summary", record.summary},
+          {"verdict", nameOf(record.verdict)},
+          {"parameters", dictionaryJson(dictionaryOf(record.parameters.experiment))},
+          {"measurements", measurementsJson(record.measurements)},
+          {"auxiliaryData", dictionaryJson(record.auxiliaryData)},
+          {"error", errorJson(record.error)},
+          {"log", logJson(record.log)},
+          {"faults", faultsJson(record.faults)},
+          {"seed", record.seed},
+          {"durations",
+           {{"setup", durationJson(durations.setup)},
+            {"run", durationJson(durations.run)},
+            {"teardown", durationJson(durations.teardown)}}}};
+}
+
 Json runDocument(const std::vector<DiagnosticRecord>& records, const std::optional<std::string>& interrupted) {
   Json diagnostics = Json::array();
   for (const DiagnosticRecord& record : records) diagnostics.push_back(recordJson(record));
-  Json document = documentOf(std::move(diagnostics));
-  if (interrupted) document["interrupted"] = *interrupted;
+  return runDocumentOf("diagnostics", std::move(diagnostics), interrupted);
+}
+
+Json experimentDocument(const std::vector<DiagnosticRecord>& records, const std::optional<std::string>& interrupted) {
+  Json experiments = Json::array();
+  for (const DiagnosticRecord& record : records) experiments.push_back(experimentJson(record));
+  return runDocumentOf("experiments", std::move(experiments), interrupted);
+}
+
+Json listDocument(const std::vector<DescribedDiagnostic>& diagnostics) {
+  Json document = documentOf("diagnostics", Json::array());
+  document["experiments"] = Json::array();
+  for (const DescribedDiagnostic& described : diagnostics) {
+    const Diagnostic& one = described.diagnostic;
+    if (one.experimentOnly) {
+      document["experiments"].push_back(
+          {{"name", one.name}, {"summary", described.description.error ? Json() : Json(described.summary())}});
+      continue;
+    }
+    document["diagnostics"].push_back({{"name", one.name},
+                                       {"summary", one.summary},
+                                       {"experiment", one.experimentName},
+                                       {"analysis", one.analysisName}});
+  }
   return document;
 }
 
-Json listDocument(const std::vector<Diagnostic>& diagnostics) {
-  Json json = Json::array();
-  for (const Diagnostic& one : diagnostics) {
-    json.push_back({{"name", one.name},
-                    {"summary", one.summary},
-                    {"experiment", one.experimentName},
-                    {"analysis", one.analysisName}});
-  }
-  return documentOf(std::move(json));
-}
-
 Json descriptionDocument(const std::vector<BoundDiagnostic>& diagnostics) {
-  Json json = Json::array();
+  Json document = documentOf("diagnostics", Json::array());
+  document["experiments"] = Json::array();
   for (const auto& [described, parameters] : diagnostics) {
     const auto& [diagnostic, description] = described;
-    json.push_back(
+    Json experiment = declarationJson(diagnostic.experimentName, description.experiment, parameters.experiment);
+    if (diagnostic.experimentOnly) {
+      experiment["error"] = errorJson(description.error);
+      document["experiments"].push_back(std::move(experiment));
+      continue;
+    }
+    document["diagnostics"].push_back(
         {{"name", diagnostic.name},
          {"summary", diagnostic.summary},
-         {"experiment", declarationJson(diagnostic.experimentName, description.experiment, parameters.experiment)},
+         {"experiment", std::move(experiment)},
          {"analysis", declarationJson(diagnostic.analysisName, description.analysis, parameters.analysis)},
          {"error", errorJson(description.error)}});
   }
-  return documentOf(std::move(json));
+  return document;
 }
 
 }  // namespace quazor

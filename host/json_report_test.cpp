@@ -75,9 +75,73 @@ TEST(RunDocument, NamesWhatWasInterrupted) {
   EXPECT_EQ(document, Json::parse(R"({"schema": 1, "diagnostics": [], "interrupted": "Slow"})"));
 }
 
-TEST(ListDocument, NamesDiagnosticsAndTheirHalves) {
-  EXPECT_EQ(listDocument({{"D", "S.", "E", "A", nullptr, nullptr}}), Json::parse(R"({"schema": 1, "diagnostics": [
-    {"name": "D", "summary": "S.", "experiment": "E", "analysis": "A"}]})"));
+TEST(ExperimentJson, HoldsEverythingInItsOrder) {
+  DiagnosticRecord record = recordOf("Name", Verdict::kError);
+  record.experimentOnly = true;
+  EXPECT_EQ(experimentJson(record).dump(), Json::parse(R"({
+    "name": "Name",
+    "summary": "Its summary.",
+    "verdict": "error",
+    "parameters": {"duration": 3},
+    "measurements": {"Raw": {"value": 90.0, "unit": "frames"}},
+    "auxiliaryData": {"bytes": "a5"},
+    "error": {"message": "it failed", "code": -1, "domain": "Domain",
+              "underlying-error": {"message": "the cause", "code": 2, "domain": "Deep"}},
+    "log": [{"time": 0.25, "level": "error", "text": "a line"}],
+    "faults": [{"operation": "CaptureStream.start", "fired": 1}],
+    "seed": 7,
+    "durations": {"setup": 0.0, "run": 3.0, "teardown": null}
+  })")
+                                               .dump());
+  EXPECT_EQ(experimentJson(recordOf("Name", Verdict::kPass))["verdict"], "pass");
+  EXPECT_TRUE(experimentJson(recordOf("Name", Verdict::kPass))["error"].is_null());
+}
+
+TEST(ExperimentJson, KeepsTheKindsOfSamples) {
+  DiagnosticRecord record = recordOf("Name", Verdict::kPass);
+  record.auxiliaryData = Dictionary{
+      {"images", Array{Dictionary{{"samples", Array{-2147483648, 4294967295U, 0.1, true}}, {"celsius", 36.6F}}}}};
+  EXPECT_EQ(experimentJson(record)["auxiliaryData"].dump(),
+            R"({"images":[{"samples":[-2147483648,4294967295,0.1,true],"celsius":36.6}]})");
+}
+
+TEST(ExperimentDocument, HoldsTheRecordsInTheirOrder) {
+  const Json document = experimentDocument({recordOf("B", Verdict::kPass), recordOf("A", Verdict::kError)}, "Slow");
+  EXPECT_EQ(document["schema"], 1);
+  ASSERT_EQ(document["experiments"].size(), 2U);
+  EXPECT_EQ(document["experiments"][0]["name"], "B");
+  EXPECT_EQ(document["experiments"][1]["name"], "A");
+  EXPECT_EQ(document["interrupted"], "Slow");
+  EXPECT_FALSE(document.contains("diagnostics"));
+  EXPECT_FALSE(experimentDocument({}, std::nullopt).contains("interrupted"));
+}
+
+DescribedDiagnostic experimentAlone() {
+  DescribedDiagnostic described;
+  described.diagnostic.name = described.diagnostic.experimentName = "X";
+  described.diagnostic.experimentOnly = true;
+  described.description.experiment = QZDescription("About X.");
+  return described;
+}
+
+TEST(ListDocument, NamesDiagnosticsAndTheirHalvesAndExperimentsApart) {
+  DescribedDiagnostic broken = experimentAlone();
+  broken.diagnostic.name = "Broken";
+  broken.description.error = hostError(HostErrorCode::kException, "it threw");
+  const DescribedDiagnostic diagnostic{{"D", "S.", "E", "A", nullptr, nullptr}, {}};
+  EXPECT_EQ(listDocument({diagnostic, experimentAlone(), broken}), Json::parse(R"({"schema": 1,
+    "diagnostics": [{"name": "D", "summary": "S.", "experiment": "E", "analysis": "A"}],
+    "experiments": [{"name": "X", "summary": "About X."}, {"name": "Broken", "summary": null}]})"));
+}
+
+TEST(DescriptionDocument, HoldsExperimentsApart) {
+  BoundDiagnostic bound;
+  bound.described = experimentAlone();
+  bound.parameters.experiment.push_back({"x", QZNumberParameter("About x.", true), Value(2.5), "profile p.json"});
+  EXPECT_EQ(descriptionDocument({bound}), Json::parse(R"({"schema": 1, "diagnostics": [], "experiments": [
+    {"name": "X", "summary": "About X.", "parameters": [
+      {"name": "x", "summary": "About x.", "required": true, "value": 2.5, "source": "profile p.json"}],
+     "error": null}]})"));
 }
 
 TEST(DescriptionDocument, HoldsDeclarationsAndValues) {
@@ -92,7 +156,7 @@ TEST(DescriptionDocument, HoldsDeclarationsAndValues) {
        {"name": "x", "summary": "About x.", "required": true, "value": 2.5, "source": "profile p.json"},
        {"name": "y", "summary": "About y.", "required": false, "value": null, "source": null}]},
      "analysis": {"name": "A", "summary": "About A.", "parameters": []},
-     "error": null}]})"));
+     "error": null}], "experiments": []})"));
 }
 
 TEST(DescriptionDocument, TellsWhyADiagnosticCannotBeDescribed) {

@@ -3,6 +3,8 @@
 #include "host/exit_code.h"
 #include "host/installation.h"
 
+#include <langinfo.h>
+#include <locale.h>
 #include <unistd.h>
 
 #include <cstdlib>
@@ -22,11 +24,20 @@ bool wantsColour() {
   return isatty(STDOUT_FILENO) == 1 && terminal != nullptr && std::string_view(terminal) != "dumb";
 }
 
+// True when text goes out as UTF-8, by the locale of the environment. The program's own locale stays what it is.
+bool writesUtf8() {
+  const locale_t locale = newlocale(LC_CTYPE_MASK, "", nullptr);
+  if (locale == nullptr) return false;  // the environment names a locale that is not installed
+  const bool utf8 = std::string_view(nl_langinfo_l(CODESET, locale)) == "UTF-8";
+  freelocale(locale);
+  return utf8;
+}
+
 }  // namespace
 
 int main(int argc, char** argv) {
   try {
-    quazor::Console console{std::cout, std::cerr, wantsColour(), isatty(STDERR_FILENO) == 1};
+    quazor::Console console{std::cout, std::cerr, wantsColour(), isatty(STDERR_FILENO) == 1, writesUtf8()};
     const std::vector<std::string> arguments(argv + (argc > 0 ? 1 : 0), argv + argc);
     return static_cast<int>(quazor::runProgram(arguments, quazor::Installation::ofThisProgram(), console));
   } catch (const std::exception& exception) {

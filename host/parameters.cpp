@@ -13,6 +13,14 @@ namespace {
 
 constexpr Half kHalves[] = {Half::kExperiment, Half::kAnalysis};
 
+// What several of them are called.
+std::string nounOf(const std::vector<DescribedDiagnostic>& diagnostics) {
+  const auto isExperiment = [](const DescribedDiagnostic& one) { return one.diagnostic.experimentOnly; };
+  if (std::all_of(diagnostics.begin(), diagnostics.end(), isExperiment)) return "experiments";
+  if (std::any_of(diagnostics.begin(), diagnostics.end(), isExperiment)) return "diagnostics and experiments";
+  return "diagnostics";
+}
+
 const OrderedMap<QZNumberParameter>& declared(const DescribedDiagnostic& diagnostic, Half half) {
   const DiagnosticDescription& description = diagnostic.description;
   return (half == Half::kExperiment ? description.experiment : description.analysis).parameters();
@@ -63,12 +71,38 @@ void checkEntry(const Profile& profile, const ProfileEntry& entry, const std::ve
   }
 }
 
+// Checks the entries of diagnostics or those of experiments.
+void checkEntries(const Profile& profile, const std::vector<ProfileEntry>& entries,
+                  const std::vector<DescribedDiagnostic>& catalogue, bool ofExperiments, bool allMustExist) {
+  for (const ProfileEntry& entry : entries) {
+    std::vector<DescribedDiagnostic> matched;
+    std::vector<std::string> names;
+    for (const DescribedDiagnostic& one : catalogue) {
+      if (one.diagnostic.experimentOnly != ofExperiments) continue;
+      names.push_back(one.diagnostic.name);
+      if (matchesName(entry.name, one.diagnostic.name)) matched.push_back(one);
+    }
+    if (!matched.empty()) {
+      checkEntry(profile, entry, matched);
+    } else if (allMustExist) {
+      const std::string noun = ofExperiments ? "experiment" : "diagnostic";
+      throw Refusal(ExitCode::kCannotRead, "the profile '" + profile.file.string() + "' has an entry '" + entry.name +
+                                               "', which fits no " + noun + didYouMean(entry.name, names));
+    }
+  }
+}
+
+const Value* findIn(const Profile& profile, const Diagnostic& diagnostic, Half half, std::string_view parameter) {
+  return diagnostic.experimentOnly ? profile.findForExperiment(diagnostic.name, diagnostic.usedBy, parameter)
+                                   : profile.find(diagnostic.name, half, parameter);
+}
+
 std::vector<BoundParameter> bindHalf(const DescribedDiagnostic& diagnostic, Half half, const Profile* profile,
                                      const std::vector<Setting>& settings) {
   std::vector<BoundParameter> bound;
   for (const auto& [name, declaration] : declared(diagnostic, half)) {
     BoundParameter parameter{name, declaration, std::nullopt, {}};
-    const Value* value = profile == nullptr ? nullptr : profile->find(diagnostic.diagnostic.name, half, name);
+    const Value* value = profile == nullptr ? nullptr : findIn(*profile, diagnostic.diagnostic, half, name);
     if (value != nullptr) {
       parameter.value = *value;
       parameter.source = "profile " + profile->file.filename().string();
@@ -115,20 +149,8 @@ Dictionary dictionaryOf(const std::vector<BoundParameter>& parameters) {
 }
 
 void checkProfile(const Profile& profile, const std::vector<DescribedDiagnostic>& catalogue, bool allMustExist) {
-  for (const ProfileEntry& entry : profile.entries) {
-    std::vector<DescribedDiagnostic> matched;
-    std::vector<std::string> names;
-    for (const DescribedDiagnostic& one : catalogue) {
-      names.push_back(one.diagnostic.name);
-      if (matchesName(entry.name, one.diagnostic.name)) matched.push_back(one);
-    }
-    if (!matched.empty()) {
-      checkEntry(profile, entry, matched);
-    } else if (allMustExist) {
-      throw Refusal(ExitCode::kCannotRead, "the profile '" + profile.file.string() + "' has an entry '" + entry.name +
-                                               "', which fits no diagnostic" + didYouMean(entry.name, names));
-    }
-  }
+  checkEntries(profile, profile.entries, catalogue, false, allMustExist);
+  checkEntries(profile, profile.experiments, catalogue, true, allMustExist);
 }
 
 void checkSettings(const std::vector<Setting>& settings, const std::vector<DescribedDiagnostic>& selected) {
@@ -136,8 +158,9 @@ void checkSettings(const std::vector<Setting>& settings, const std::vector<Descr
     const Setting& setting = settings[i];
     const std::vector<std::string> names = declaredNames(selected, setting.half);
     if (!contains(names, setting.name)) {
-      const std::string where = setting.half ? "no " + std::string(nameOf(*setting.half)) + " of the diagnostics"
-                                             : std::string("none of the diagnostics");
+      const std::string noun = nounOf(selected);
+      const std::string where =
+          setting.half ? "no " + std::string(nameOf(*setting.half)) + " of the " + noun : "none of the " + noun;
       throw Refusal(ExitCode::kUsage, "--set '" + setting.text + "': " + where + " takes a parameter '" + setting.name +
                                           "'" + didYouMean(setting.name, names) + noteOfUndescribed(selected));
     }
@@ -161,7 +184,8 @@ void requireParameters(const DescribedDiagnostic& diagnostic, const BoundParamet
   for (const Half half : kHalves) {
     for (const BoundParameter& one : parameters.of(half)) {
       if (one.value || !one.declaration.required()) continue;
-      const std::string name = formatMessage("%@.%@", nameOf(half), one.name);
+      const std::string name =
+          diagnostic.diagnostic.experimentOnly ? one.name : formatMessage("%@.%@", nameOf(half), one.name);
       throw Refusal(ExitCode::kUsage,
                     formatMessage("%@ needs the parameter %@; give it with --set %@=VALUE or in a profile",
                                   diagnostic.diagnostic.name, name, name));

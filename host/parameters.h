@@ -46,18 +46,22 @@ Dictionary dictionaryOf(const std::vector<BoundParameter>& parameters);
 struct DescribedDiagnostic {
   Diagnostic diagnostic;
   DiagnosticDescription description;
+
+  // The diagnostic's, or that of an experiment on its own.
+  const std::string& summary() const {
+    return diagnostic.experimentOnly ? description.experiment.summary() : diagnostic.summary;
+  }
 };
 
-// Throws a Refusal (kCannotRead) for a profile's parameter that no diagnostic of its entry declares and, if
-// `allMustExist`, for an entry that fits no diagnostic. An entry whose diagnostics could not be described is passed
-// over.
+// Throws a Refusal (kCannotRead) for a profile's parameter that no diagnostic or experiment of its entry declares and,
+// if `allMustExist`, for an entry that fits none. An entry for something that could not be described is passed over.
 void checkProfile(const Profile& profile, const std::vector<DescribedDiagnostic>& catalogue, bool allMustExist);
 
-// Throws a Refusal (kUsage) for a setting whose parameter none of the diagnostics declares, and for two settings of one
-// parameter of one diagnostic.
+// Throws a Refusal (kUsage) for a setting whose parameter none of the selected declares, and for two settings of one
+// parameter.
 void checkSettings(const std::vector<Setting>& settings, const std::vector<DescribedDiagnostic>& selected);
 
-// The parameters of one diagnostic: a setting's value wins over the profile's. `profile` may be null.
+// The parameters of one diagnostic or experiment: a setting's value wins over the profile's. `profile` may be null.
 BoundParameters bindParameters(const DescribedDiagnostic& diagnostic, const Profile* profile,
                                const std::vector<Setting>& settings);
 

@@ -42,6 +42,13 @@ DescribedDiagnostic undescribed() {
   return described;
 }
 
+DescribedDiagnostic imagesAlone() {
+  DescribedDiagnostic described = diagnosticWith("Images", {{"images", true}, {"timeout", true}}, {});
+  described.diagnostic.experimentOnly = true;
+  described.diagnostic.usedBy = {"Fault", "Sync.Back"};
+  return described;
+}
+
 Profile profileWith(const std::string& diagnostics) {
   return parseProfile("dir/some.json", R"({"schema": 1, "diagnostics": )" + diagnostics + "}");
 }
@@ -120,6 +127,34 @@ TEST(CheckSettings, RefusesWhatNoneOfTheDiagnosticsTakes) {
   EXPECT_THAT(check({"duration=3"}, {fault()}), HasSubstr("takes a parameter 'duration'"));
 }
 
+TEST(CheckSettings, SpeaksOfWhatIsSelected) {
+  const auto check = [](const std::string& text, const std::vector<DescribedDiagnostic>& selected) {
+    return refusalOf(ExitCode::kUsage, [&] { checkSettings(settings({text}), selected); });
+  };
+  EXPECT_EQ(check("x=3", {imagesAlone()}), "--set 'x=3': none of the experiments takes a parameter 'x'");
+  EXPECT_EQ(check("analysis.images=3", {imagesAlone()}),
+            "--set 'analysis.images=3': no analysis of the experiments takes a parameter 'images'");
+  EXPECT_EQ(check("x=3", {imagesAlone(), fault()}),
+            "--set 'x=3': none of the diagnostics and experiments takes a parameter 'x'");
+  EXPECT_EQ(check("experiment.images=3", {imagesAlone()}), "accepted");
+}
+
+TEST(CheckProfile, ChecksTheEntriesOfExperimentsAgainstExperiments) {
+  const auto check = [](const std::string& experiments, bool allMustExist) {
+    const Profile profile =
+        parseProfile("some.json", R"({"schema": 1, "diagnostics": {}, "experiments": )" + experiments + "}");
+    return refusalOf(ExitCode::kCannotRead, [&] { checkProfile(profile, {sync(), imagesAlone()}, allMustExist); });
+  };
+  EXPECT_EQ(check(R"({"Im*": {"images": 5}})", true), "accepted");
+  EXPECT_EQ(check(R"({"Images": {"image": 5}})", false),
+            "the profile 'some.json' sets 'image', which no experiment of 'Images' takes; did you mean 'images'?");
+  EXPECT_EQ(check(R"({"Image": {"images": 5}})", true),
+            "the profile 'some.json' has an entry 'Image', which fits no experiment; did you mean 'Images'?");
+  EXPECT_EQ(check(R"({"Sync.Back": {"duration": 5}})", true),
+            "the profile 'some.json' has an entry 'Sync.Back', which fits no experiment");
+  EXPECT_EQ(check(R"({"Sync.Back": {"duration": 5}})", false), "accepted");
+}
+
 TEST(CheckSettings, SaysWhenADiagnosticsParametersAreNotKnown) {
   EXPECT_THAT(refusalOf(ExitCode::kUsage, [] { checkSettings(settings({"x=3"}), {undescribed()}); }),
               HasSubstr("(Broken could not be described: it threw)"));
@@ -184,6 +219,20 @@ TEST(BindParameters, SetsAParameterWithAPrefixOnlyThere) {
   EXPECT_EQ(bound.analysis[0].value, Value(7));
 }
 
+TEST(BindParameters, GivesAnExperimentItsOwnValuesAndElseThoseOfItsDiagnostics) {
+  const Profile profile = parseProfile("some.json", R"({"schema": 1,
+    "diagnostics": {"Sync.*": {"experiment": {"images": 1, "timeout": 2}}, "Fault": {"experiment": {"timeout": 3}}},
+    "experiments": {"Images": {"images": 4}}})");
+  BoundParameters bound = bindParameters(imagesAlone(), &profile, {});
+  ASSERT_EQ(bound.experiment.size(), 2U);
+  EXPECT_EQ(bound.experiment[0].value, Value(4));
+  EXPECT_EQ(bound.experiment[0].source, "profile some.json");
+  EXPECT_EQ(bound.experiment[1].value, Value(3));
+  EXPECT_TRUE(bound.analysis.empty());
+  bound = bindParameters(imagesAlone(), &profile, settings({"experiment.images=9"}));
+  EXPECT_EQ(bound.experiment[0].value, Value(9));
+}
+
 TEST(RequireParameters, RefusesARequiredParameterWithoutAValue) {
   const auto require = [](const DescribedDiagnostic& diagnostic, const std::vector<std::string>& texts) {
     return refusalOf(ExitCode::kUsage,
@@ -192,6 +241,8 @@ TEST(RequireParameters, RefusesARequiredParameterWithoutAValue) {
   EXPECT_EQ(require(sync(), {}),
             "Sync.Back needs the parameter experiment.duration; give it with "
             "--set experiment.duration=VALUE or in a profile");
+  EXPECT_EQ(require(imagesAlone(), {"timeout=1"}),
+            "Images needs the parameter images; give it with --set images=VALUE or in a profile");
   EXPECT_THAT(require(fault(), {"experiment.frameCount=1", "timeout=1"}), HasSubstr("analysis.frameCount"));
   EXPECT_EQ(require(fault(), {"frameCount=1", "timeout=1"}), "accepted");
   EXPECT_EQ(require(relaxed(), {}), "accepted");

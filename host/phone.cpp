@@ -24,6 +24,8 @@ class PhoneOfScenario final : public Phone {
     return faults;
   }
 
+  std::uint64_t framesDelivered() const override { return phone_.framesDelivered(); }
+
  private:
   SimulatedPhone phone_;
 };

@@ -29,6 +29,8 @@ class Phone {
 
   virtual Platform platform() const = 0;
   virtual std::vector<DeclaredFault> faults() const = 0;
+  // How many frames its cameras have handed to handlers. Any thread.
+  virtual std::uint64_t framesDelivered() const = 0;
 };
 
 // Makes a new phone on every call, each like the first.

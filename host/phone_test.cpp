@@ -2,6 +2,8 @@
 
 #include "host/exit_code.h"
 #include "host/test_directory.h"
+#include "platform/capture_keys.h"
+#include "platform/pixel_buffer.h"
 
 #include <gmock/gmock.h>
 #include <gtest/gtest.h>
@@ -26,6 +28,31 @@ TEST(PhonesOfScenario, MakesANewPhoneEveryTime) {
   EXPECT_EQ(first->faults()[0].fired, 1U);
   EXPECT_EQ(first->faults()[0].fault["operation"], "CapturePlugIn.device");
   EXPECT_EQ(second->faults()[0].fired, 0U);
+}
+
+TEST(PhonesOfScenario, CountsTheFramesThatHandlersGet) {
+  using namespace std::chrono_literals;
+  constexpr const char* kOneCamera =
+      R"({"title": "One camera", "cameras": {"wide": {"port": "BackFacingCamera", "formats": [{"maximumFrameRate": 30}]}},
+          "groups": {"back": {"cameras": ["wide"], "master": "wide"}}, "faults": []})";
+  const TestDirectory directory;
+  const std::unique_ptr<Phone> phone = phonesOfScenario(directory.write("one.json", kOneCamera), false, 1)();
+  const std::shared_ptr<CaptureDevice> device = phone->platform().capture->createPlugIn()->device(nullptr);
+  const CaptureStreams streams = *device->streams(nullptr);
+  ASSERT_TRUE(device->requestControlOfStreams(streams, nullptr));
+  std::uint64_t handled = 0;
+  const auto handler = std::make_shared<PixelBufferHandler>([&handled](PixelBuffer&, MediaTime) { ++handled; });
+  const std::string output(capture_key::PrimaryScaler);
+  ASSERT_TRUE(streams[0]->setValue(Dictionary{{output, true}}, capture_key::VideoOutputsEnabled, nullptr));
+  ASSERT_TRUE(
+      streams[0]->setValue(Dictionary{{output, Dictionary{{std::string(capture_key::PixelBufferHandler), handler}}}},
+                           capture_key::VideoOutputHandlers, nullptr));
+  ASSERT_TRUE(streams[0]->start(nullptr));
+  EXPECT_EQ(phone->framesDelivered(), 0U);
+  phone->platform().clock->sleep(101ms);
+  EXPECT_EQ(handled, 3U);
+  EXPECT_EQ(phone->framesDelivered(), 3U);
+  device->invalidate(nullptr);
 }
 
 TEST(PhonesOfScenario, LetsTimePassAsAsked) {

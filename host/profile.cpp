@@ -74,19 +74,33 @@ OrderedMap<Value> valuesOf(const std::filesystem::path& file, const std::string&
   return values;
 }
 
+const Value* findIn(const std::vector<ProfileEntry>& entries, const std::string& name, Half half,
+                    std::string_view parameter) {
+  const Value* found = nullptr;
+  for (const ProfileEntry& entry : entries) {
+    const Value* value = entry.values(half).find(parameter);
+    if (value == nullptr || !matchesName(entry.name, name)) continue;
+    if (entry.name == name) return value;
+    found = value;
+  }
+  return found;
+}
+
 }  // namespace
 
 std::string_view nameOf(Half half) { return half == Half::kExperiment ? "experiment" : "analysis"; }
 
 const Value* Profile::find(const std::string& diagnostic, Half half, std::string_view parameter) const {
-  const Value* found = nullptr;
-  for (const ProfileEntry& entry : entries) {
-    const Value* value = entry.values(half).find(parameter);
-    if (value == nullptr || !matchesName(entry.name, diagnostic)) continue;
-    if (entry.name == diagnostic) return value;
-    found = value;
+  return findIn(entries, diagnostic, half, parameter);
+}
+
+const Value* Profile::findForExperiment(const std::string& experiment, const std::vector<std::string>& usedBy,
+                                        std::string_view parameter) const {
+  const Value* value = findIn(experiments, experiment, Half::kExperiment, parameter);
+  for (auto user = usedBy.begin(); value == nullptr && user != usedBy.end(); ++user) {
+    value = find(*user, Half::kExperiment, parameter);
   }
-  return found;
+  return value;
 }
 
 Profile readProfile(const std::filesystem::path& file) {
@@ -102,7 +116,7 @@ Profile readProfile(const std::filesystem::path& file) {
 
 Profile parseProfile(const std::filesystem::path& file, const std::string& text) {
   const Json document = parseJson(file, text);
-  checkKeys(file, "/", document, {"schema", "diagnostics"});
+  checkKeys(file, "/", document, {"schema", "diagnostics", "experiments"});
   const auto schema = document.find("schema");
   if (schema == document.end() || *schema != 1) refuse(file, "must say \"schema\": 1, the only form that is known");
   const auto diagnostics = document.find("diagnostics");
@@ -116,6 +130,12 @@ Profile parseProfile(const std::filesystem::path& file, const std::string& text)
     if (halves.contains("experiment")) entry.experiment = valuesOf(file, place + "/experiment", halves["experiment"]);
     if (halves.contains("analysis")) entry.analysis = valuesOf(file, place + "/analysis", halves["analysis"]);
     profile.entries.push_back(std::move(entry));
+  }
+  const auto experiments = document.find("experiments");
+  if (experiments == document.end()) return profile;
+  if (!experiments->is_object()) refuse(file, "is wrong at /experiments: an object must stand there");
+  for (const auto& [name, values] : experiments->items()) {
+    profile.experiments.push_back({name, valuesOf(file, "/experiments/" + name, values), {}});
   }
   return profile;
 }

@@ -77,6 +77,12 @@ TEST(ParseProfile, RefusesWhatIsNotExactlyOfTheForm) {
        "at /diagnostics/A/analysis/x: a number must stand there"},
       {"a number beyond all numbers", withDiagnostics(R"({"A": {"experiment": {"x": 1e999}}})"), "cannot be parsed"},
       {"a parameter twice", withDiagnostics(R"({"A": {"experiment": {"x": 1, "x": 2}}})"), "holds 'x' twice"},
+      {"experiments that are no object", R"({"schema": 1, "diagnostics": {}, "experiments": 3})",
+       "at /experiments: an object must stand there"},
+      {"an experiment that is no object", R"({"schema": 1, "diagnostics": {}, "experiments": {"E": 3}})",
+       "at /experiments/E: an object must stand there"},
+      {"an experiment's value that is text", R"({"schema": 1, "diagnostics": {}, "experiments": {"E": {"x": "3"}}})",
+       "at /experiments/E/x: a number must stand there"},
       {"an entry twice", withDiagnostics(R"({"A": {}, "A": {}})"), "holds 'A' twice"},
   };
   for (const Row& row : rows) {
@@ -89,6 +95,35 @@ TEST(ParseProfile, RefusesWhatIsNotExactlyOfTheForm) {
 TEST(ParseProfile, TakesOneKeyInSeveralObjects) {
   EXPECT_EQ(refusalOf(withDiagnostics(R"({"A": {"experiment": {"x": 1}, "analysis": {"x": 2}}, "B": {}})")),
             "accepted");
+}
+
+TEST(Profile, FindsTheValueForAnExperiment) {
+  const Profile profile = parseProfile(kFile, R"({
+    "schema": 1,
+    "diagnostics": {"A": {"experiment": {"z": 6}, "analysis": {"w": 9}}, "B": {"experiment": {"x": 7, "z": 8}}},
+    "experiments": {"E.One": {"x": 1}, "E.*": {"x": 2, "y": 3}}
+  })");
+  struct Row {
+    const char* name;
+    const char* experiment;
+    std::vector<std::string> usedBy;
+    const char* parameter;
+    std::optional<Value> value;
+  };
+  const Row rows[] = {
+      {"its own entry wins over a later pattern and its diagnostics", "E.One", {"B"}, "x", Value(1)},
+      {"a pattern wins over its diagnostics", "E.Two", {"B"}, "x", Value(2)},
+      {"a pattern gives what the own entry leaves out", "E.One", {}, "y", Value(3)},
+      {"a diagnostic gives what no entry holds", "E.One", {"A", "B"}, "z", Value(6)},
+      {"the first of its diagnostics that has it", "F", {"A", "B"}, "x", Value(7)},
+      {"an analysis' value is not the experiment's", "E.One", {"A", "B"}, "w", std::nullopt},
+      {"another diagnostic's value is not its own", "E.One", {}, "z", std::nullopt},
+  };
+  for (const Row& row : rows) {
+    const Value* value = profile.findForExperiment(row.experiment, row.usedBy, row.parameter);
+    EXPECT_EQ(value == nullptr ? std::nullopt : std::optional(*value), row.value) << row.name;
+  }
+  EXPECT_EQ(profile.find("E.One", Half::kExperiment, "x"), nullptr);
 }
 
 TEST(ReadProfile, RefusesAFileThatIsNotThereAndADirectory) {

@@ -1,4 +1,4 @@
-// The progress line: what is running, and for how long.
+// The progress line: what is running, for how long, and how many frames have come.
 #pragma once
 
 #include "frame/log_channel.h"
@@ -6,6 +6,7 @@
 
 #include <chrono>
 #include <condition_variable>
+#include <cstdint>
 #include <functional>
 #include <memory>
 #include <mutex>
@@ -16,12 +17,17 @@
 
 namespace quazor {
 
-// The seconds that a run is expected to take: its experiment's parameter "duration", else its "timeout"; nothing when
-// it has neither above zero.
-std::optional<double> expectedSeconds(const BoundParameters& parameters);
+// What a run is expected to come to; nothing where its parameters do not say.
+struct Expectation {
+  std::optional<double> seconds;        // the experiment's parameter "duration", else its "timeout", if above zero
+  std::optional<std::uint64_t> frames;  // the experiment's parameter "frameCount", if 1 or more
+};
 
-// "Running NAME: 1.2 s of 3 s" or, without an expectation, "Running NAME: 1.2 s".
-std::string progressText(const std::string& name, double elapsedSeconds, std::optional<double> expectedSeconds);
+Expectation expectationOf(const BoundParameters& parameters);
+
+// "Running NAME: 1.2 s of 3 s, 36 of 90 frames", without what is not expected or not known.
+std::string progressText(const std::string& name, double elapsedSeconds, const Expectation& expected,
+                         std::optional<std::uint64_t> frames);
 
 // Keeps one line of a terminal up to date while something runs, from 0.3 seconds after its beginning on, and erases it
 // at the end. Any thread.
@@ -34,22 +40,25 @@ class Progress {
   ~Progress() { stop(); }
 
   // REQUIRES: nothing is running.
-  void start(const std::string& name, std::optional<double> expectedSeconds);
+  void start(const std::string& name, const Expectation& expected);
+  // Asks `count` for the frames that have come, on a thread of its own, until stop(); it must not use this object.
+  void countFrames(std::function<std::uint64_t()> count);
   // When it returns, the line is erased and stays so. Does nothing when nothing is running.
   void stop();
   // Erases the line and calls `write`, which may write to the terminal; the line comes back with its next change.
   void aside(const std::function<void()>& write);
 
  private:
-  void show(const std::string& name, std::optional<double> expectedSeconds);
+  void show(const std::string& name, const Expectation& expected);
   void erase();
 
   std::ostream* const terminal_;
   std::mutex mutex_;  // held while the terminal is written to
   std::condition_variable wake_;
-  bool running_ = false;  // guarded by mutex_
-  bool shown_ = false;    // guarded by mutex_
-  std::thread thread_;    // touched by start() and stop() only
+  bool running_ = false;                   // guarded by mutex_
+  bool shown_ = false;                     // guarded by mutex_
+  std::function<std::uint64_t()> frames_;  // guarded by mutex_
+  std::thread thread_;                     // touched by start() and stop() only
 };
 
 // Hands log lines on with the progress line out of their way.

@@ -1,5 +1,7 @@
 #include "host/run_report.h"
 
+#include "host/csv_report.h"
+#include "host/experiment_report.h"
 #include "host/json_report.h"
 #include "host/output_file.h"
 #include "host/table.h"
@@ -24,7 +26,7 @@ RunReport::RunReport(ReportOptions options, Console& console)
 void RunReport::begin(const std::string& name, const BoundParameters& parameters) {
   const std::lock_guard lock(mutex_);
   running_ = name;
-  progress_.start(name, expectedSeconds(parameters));
+  progress_.start(name, expectationOf(parameters));
 }
 
 void RunReport::finish(DiagnosticRecord record) {
@@ -34,9 +36,13 @@ void RunReport::finish(DiagnosticRecord record) {
   if (!options_.output.empty()) {
     printVerdict(console_.out, record, console_.colour);
   } else if (options_.format == Format::kText) {
-    printRecord(console_.out, record, console_.colour);
+    print(console_.out, record, console_.colour);
   }
   console_.out.flush();
+  // A table has no place for errors.
+  if (options_.format == Format::kCsv && record.error != nullptr) {
+    console_.err << "quazor: " << printable(record.name) << " ended in an error\n" << errorText(record.error, "  ");
+  }
   printUnfiredFaults(console_.err, record);
   records_.push_back(std::move(record));
 }
@@ -57,13 +63,28 @@ void RunReport::interrupt(const std::function<void()>& leave) {
   leave();
 }
 
+void RunReport::print(std::ostream& out, const DiagnosticRecord& record, bool colour) const {
+  if (options_.ofExperiments) {
+    printExperiment(out, record, {colour, console_.blocks});
+  } else {
+    printRecord(out, record, colour);
+  }
+}
+
+void RunReport::printCounts(std::ostream& out) const {
+  options_.ofExperiments ? printExperimentSummary(out, records_) : printSummary(out, records_);
+}
+
 ExitCode RunReport::writeEnd(const std::optional<std::string>& interrupted) {
   const bool toFile = !options_.output.empty();
   const bool summarized = toFile || options_.format == Format::kText;
-  if (summarized && (records_.size() != 1 || interrupted)) printSummary(console_.out, records_);
-  if (!toFile && options_.format == Format::kJson) console_.out << reportText(interrupted);
+  if (summarized && (records_.size() != 1 || interrupted)) printCounts(console_.out);
+  if (!toFile && options_.format != Format::kText) console_.out << reportText(interrupted);
   console_.out.flush();
-  if (interrupted && interrupted->empty()) console_.err << "quazor: interrupted between two diagnostics\n";
+  if (interrupted && interrupted->empty()) {
+    console_.err << "quazor: interrupted between two " << (options_.ofExperiments ? "experiments" : "diagnostics")
+                 << '\n';
+  }
   if (interrupted && !interrupted->empty()) {
     console_.err << "quazor: interrupted while " << printable(*interrupted) << " was running\n";
   }
@@ -79,10 +100,14 @@ ExitCode RunReport::writeEnd(const std::optional<std::string>& interrupted) {
 }
 
 std::string RunReport::reportText(const std::optional<std::string>& interrupted) const {
-  if (options_.format == Format::kJson) return documentText(runDocument(records_, interrupted));
+  if (options_.format == Format::kCsv) return experimentCsv(records_);
+  if (options_.format == Format::kJson) {
+    return documentText(options_.ofExperiments ? experimentDocument(records_, interrupted)
+                                               : runDocument(records_, interrupted));
+  }
   std::ostringstream text;
-  for (const DiagnosticRecord& record : records_) printRecord(text, record, false);
-  if (records_.size() != 1 || interrupted) printSummary(text, records_);
+  for (const DiagnosticRecord& record : records_) print(text, record, false);
+  if (records_.size() != 1 || interrupted) printCounts(text);
   if (interrupted && !interrupted->empty())
     text << "Interrupted while " << printable(*interrupted) << " was running.\n";
   return text.str();

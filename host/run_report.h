@@ -1,4 +1,4 @@
-// RunReport: what a run of diagnostics prints and writes, as it goes and at its end.
+// RunReport: what a run of diagnostics or experiments prints and writes, as it goes and at its end.
 #pragma once
 
 #include "host/diagnostic_run.h"
@@ -21,17 +21,19 @@ struct Console {
   std::ostream& err;
   bool colour = false;         // on `out`
   bool showsProgress = false;  // on `err`: it is a terminal
+  bool blocks = false;         // text may be UTF-8, with block elements in it
 };
 
-enum class Format { kText, kJson };
+enum class Format { kText, kJson, kCsv };
 
 struct ReportOptions {
-  Format format = Format::kText;
-  std::filesystem::path output;  // where the report goes; empty for the console
+  Format format = Format::kText;  // kCsv is for experiments only
+  std::filesystem::path output;   // where the report goes; empty for the console
+  bool ofExperiments = false;     // of experiments on their own
 };
 
-// The text report goes out record by record, the JSON document at the end. With an output file the report goes there at
-// the end, and the console gets one line a diagnostic.
+// The text report goes out record by record, the JSON document or CSV table at the end. With an output file the report
+// goes there at the end, and the console gets one line a diagnostic.
 //
 // The interrupt may come on any thread at any time; the others calls are the running thread's.
 class RunReport {
@@ -53,6 +55,8 @@ class RunReport {
   Progress& progress() { return progress_; }
 
  private:
+  void print(std::ostream& out, const DiagnosticRecord& record, bool colour) const;
+  void printCounts(std::ostream& out) const;
   ExitCode writeEnd(const std::optional<std::string>& interrupted);
   std::string reportText(const std::optional<std::string>& interrupted) const;
 

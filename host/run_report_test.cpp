@@ -96,6 +96,70 @@ TEST_F(RunReportTest, TellsWhenTheStandardOutputCannotBeWritten) {
   EXPECT_EQ(err_.str(), "quazor: the standard output cannot be written\n");
 }
 
+class ExperimentReportTest : public RunReportTest {
+ protected:
+  static void run(RunReport& report, const std::vector<Verdict>& verdicts) {
+    std::string name = "A";
+    for (const Verdict verdict : verdicts) {
+      DiagnosticRecord record = recordOf(name, verdict);
+      record.experimentOnly = true;
+      record.auxiliaryData.set("samples", Array{0, 1, 2, 3, 4, 5, 6, 7});
+      report.begin(name, {});
+      report.finish(std::move(record));
+      ++name[0];
+    }
+  }
+};
+
+TEST_F(ExperimentReportTest, PrintsEachExperimentAndHowManyThereWere) {
+  RunReport report({Format::kText, {}, true}, console_);
+  run(report, {Verdict::kPass, Verdict::kError});
+  EXPECT_THAT(out_.str(), testing::AllOf(HasSubstr("  DONE\n"), HasSubstr("  ERROR\n"), HasSubstr("\n  .:::::::\n")));
+  EXPECT_EQ(report.conclude(), ExitCode::kError);
+  EXPECT_THAT(out_.str(), EndsWith("2 experiments: 1 returned a result, 1 ended in an error\n"));
+}
+
+TEST_F(ExperimentReportTest, DrawsBlocksWhereTheConsoleTakesThem) {
+  console_.blocks = true;
+  RunReport report({Format::kText, {}, true}, console_);
+  run(report, {Verdict::kPass});
+  EXPECT_EQ(report.conclude(), ExitCode::kAllPassed);
+  EXPECT_THAT(out_.str(), HasSubstr("\u2588"));
+}
+
+TEST_F(ExperimentReportTest, WritesTheDocumentOfExperiments) {
+  RunReport report({Format::kJson, {}, true}, console_);
+  run(report, {Verdict::kPass});
+  EXPECT_EQ(report.conclude(), ExitCode::kAllPassed);
+  EXPECT_EQ(Json::parse(out_.str())["experiments"].size(), 1U);
+}
+
+TEST_F(ExperimentReportTest, WritesOneTableAndTellsErrorsBesideIt) {
+  RunReport report({Format::kCsv, {}, true}, console_);
+  run(report, {Verdict::kPass, Verdict::kError});
+  EXPECT_EQ(out_.str(), "");
+  EXPECT_EQ(report.conclude(), ExitCode::kError);
+  EXPECT_EQ(out_.str(), "experiment,measurement,value,unit\nA,Raw,90,frames\nB,Raw,90,frames\n");
+  EXPECT_EQ(err_.str(),
+            "quazor: B ended in an error\n  Domain code -1: it failed\n  caused by Deep code 2: the cause\n");
+}
+
+TEST_F(ExperimentReportTest, WritesTheTableToAFile) {
+  RunReport report({Format::kCsv, directory_.path() / "out", true}, console_);
+  run(report, {Verdict::kPass});
+  EXPECT_EQ(report.conclude(), ExitCode::kAllPassed);
+  EXPECT_EQ(directory_.read("out"), "experiment,measurement,value,unit\nA,Raw,90,frames\n");
+  EXPECT_EQ(out_.str(), "DONE  A\n");
+}
+
+TEST_F(ExperimentReportTest, SpeaksOfExperimentsWhenInterruptedBetweenTwo) {
+  RunReport report({Format::kCsv, {}, true}, console_);
+  run(report, {Verdict::kPass});
+  report.interrupt([] {});
+  EXPECT_EQ(err_.str(), "quazor: interrupted between two experiments\n");
+  EXPECT_THAT(out_.str(), HasSubstr("A,Raw,90,frames\n"));
+}
+
 TEST_F(RunReportTest, PointsOutUnfiredFaults) {
   RunReport report({}, console_);
   DiagnosticRecord record = recordOf("A", Verdict::kPass);

@@ -16,9 +16,9 @@ constexpr std::string_view kRed = "\033[31m";
 constexpr std::string_view kYellow = "\033[33m";
 constexpr std::string_view kPlain = "\033[0m";
 
-std::string_view wordOf(Verdict verdict) {
-  switch (verdict) {
-    case Verdict::kPass: return "PASS";
+std::string_view wordOf(const DiagnosticRecord& record) {
+  switch (record.verdict) {
+    case Verdict::kPass: return record.experimentOnly ? "DONE" : "PASS";
     case Verdict::kFail: return "FAIL";
     case Verdict::kError: break;
   }
@@ -32,11 +32,6 @@ std::string_view colourOf(Verdict verdict) {
     case Verdict::kError: break;
   }
   return kYellow;
-}
-
-std::string colouredWord(Verdict verdict, bool colour) {
-  const std::string word(wordOf(verdict));
-  return colour ? std::string(colourOf(verdict)) + word + std::string(kPlain) : word;
 }
 
 std::string rangeText(const QZLimit& limit) {
@@ -92,6 +87,27 @@ std::string count(std::size_t number, std::string_view what) {
   return std::to_string(number) + " " + std::string(what);
 }
 
+// What stands below the name in a description.
+std::string headline(const Diagnostic& diagnostic) {
+  if (!diagnostic.experimentOnly) return diagnostic.summary;
+  if (diagnostic.usedBy.empty()) return "An experiment that no diagnostic uses.";
+  std::string text = "An experiment; used by ";
+  std::string_view separator;
+  for (const std::string& user : diagnostic.usedBy) {
+    text += separator;
+    text += user;
+    separator = ", ";
+  }
+  return text + ".";
+}
+
+// What stands beside an experiment's name in a list.
+std::string listedSummary(const DescribedDiagnostic& one) {
+  const DiagnosticErrorPtr& error = one.description.error;
+  if (error != nullptr) return "could not be described: " + printable(error->localizedDescription());
+  return printable(one.summary());
+}
+
 }  // namespace
 
 std::string limitText(const std::optional<QZLimit>& limit) {
@@ -111,20 +127,25 @@ std::string errorText(const DiagnosticErrorPtr& error, std::string_view indent) 
   return text;
 }
 
+std::string verdictText(const DiagnosticRecord& record, bool colour) {
+  const std::string word(wordOf(record));
+  return colour ? std::string(colourOf(record.verdict)) + word + std::string(kPlain) : word;
+}
+
 void printRecord(std::ostream& out, const DiagnosticRecord& record, bool colour) {
   out << printable(record.name) << '\n' << indentedLines(record.summary, "  ");
   if (!record.measuredResults.empty()) {
     out << '\n';
     printResults(out, record.measuredResults, colour);
   }
-  out << "\n  " << colouredWord(record.verdict, colour) << '\n';
+  out << "\n  " << verdictText(record, colour) << '\n';
   if (record.verdict == Verdict::kError) out << errorText(record.error, "    ");
   out << '\n';
 }
 
 void printVerdict(std::ostream& out, const DiagnosticRecord& record, bool colour) {
-  const std::string padding(5 - wordOf(record.verdict).size(), ' ');
-  out << colouredWord(record.verdict, colour) << padding << ' ' << printable(record.name) << '\n';
+  const std::string padding(5 - wordOf(record).size(), ' ');
+  out << verdictText(record, colour) << padding << ' ' << printable(record.name) << '\n';
 }
 
 void printSummary(std::ostream& out, const std::vector<DiagnosticRecord>& records) {
@@ -145,23 +166,35 @@ void printUnfiredFaults(std::ostream& out, const DiagnosticRecord& record) {
   }
 }
 
-void printList(std::ostream& out, const std::vector<Diagnostic>& diagnostics) {
-  Table table({Table::Align::kLeft, Table::Align::kLeft});
-  for (const Diagnostic& one : diagnostics) table.addRow({printable(one.name), printable(one.summary)});
-  table.print(out, "");
+void printList(std::ostream& out, const std::vector<DescribedDiagnostic>& diagnostics) {
+  Table ofDiagnostics({Table::Align::kLeft, Table::Align::kLeft});
+  Table ofExperiments({Table::Align::kLeft, Table::Align::kLeft});
+  bool hasDiagnostics = false;
+  bool hasExperiments = false;
+  for (const DescribedDiagnostic& one : diagnostics) {
+    const bool alone = one.diagnostic.experimentOnly;
+    (alone ? hasExperiments : hasDiagnostics) = true;
+    (alone ? ofExperiments : ofDiagnostics).addRow({printable(one.diagnostic.name), listedSummary(one)});
+  }
+  ofDiagnostics.print(out, "");
+  if (!hasExperiments) return;
+  if (hasDiagnostics) out << '\n';
+  out << "Experiments that no diagnostic uses; 'quazor experiment NAME' runs one:\n";
+  ofExperiments.print(out, "  ");
 }
 
 void printDescriptions(std::ostream& out, const std::vector<BoundDiagnostic>& diagnostics) {
   std::string_view separator;
   for (const auto& [described, parameters] : diagnostics) {
     const auto& [diagnostic, description] = described;
-    out << separator << printable(diagnostic.name) << '\n' << indentedLines(diagnostic.summary, "  ");
+    out << separator << printable(diagnostic.name) << '\n' << indentedLines(headline(diagnostic), "  ");
     separator = "\n";
     if (description.error != nullptr) {
       out << "\n  It could not be described.\n" << errorText(description.error, "    ");
       continue;
     }
     printHalf(out, "Experiment", diagnostic.experimentName, description.experiment, parameters.experiment);
+    if (diagnostic.experimentOnly) continue;
     printHalf(out, "Analysis", diagnostic.analysisName, description.analysis, parameters.analysis);
   }
 }

@@ -17,6 +17,9 @@ std::string limitText(const std::optional<QZLimit>& limit);
 // The error and the errors that caused it, one line each, the nearest first.
 std::string errorText(const DiagnosticErrorPtr& error, std::string_view indent);
 
+// "PASS", "FAIL" or "ERROR"; "DONE" for an experiment on its own that returned a result.
+std::string verdictText(const DiagnosticRecord& record, bool colour);
+
 // One diagnostic's measured results as a table, then its verdict and, with kError, the error.
 void printRecord(std::ostream& out, const DiagnosticRecord& record, bool colour);
 
@@ -29,7 +32,8 @@ void printSummary(std::ostream& out, const std::vector<DiagnosticRecord>& record
 // Points out each declared fault that never fired: the run does not show what its scenario is for.
 void printUnfiredFaults(std::ostream& out, const DiagnosticRecord& record);
 
-void printList(std::ostream& out, const std::vector<Diagnostic>& diagnostics);
+// The diagnostics, then the experiments on their own, whose descriptions must be known.
+void printList(std::ostream& out, const std::vector<DescribedDiagnostic>& diagnostics);
 void printDescriptions(std::ostream& out, const std::vector<BoundDiagnostic>& diagnostics);
 
 }  // namespace quazor

@@ -100,6 +100,17 @@ TEST(PrintVerdict, IsOneLine) {
   EXPECT_EQ(out.str(), "PASS  One\nERROR Two\n");
 }
 
+TEST(VerdictText, DoesNotCallAnExperimentPassed) {
+  DiagnosticRecord record = recordOf("X", Verdict::kPass);
+  EXPECT_EQ(verdictText(record, false), "PASS");
+  record.experimentOnly = true;
+  EXPECT_EQ(verdictText(record, false), "DONE");
+  EXPECT_EQ(verdictText(record, true), "\033[32mDONE\033[0m");
+  record.verdict = Verdict::kError;
+  EXPECT_EQ(verdictText(record, false), "ERROR");
+  EXPECT_EQ(verdictText(recordOf("X", Verdict::kFail), false), "FAIL");
+}
+
 TEST(PrintSummary, CountsTheVerdicts) {
   std::ostringstream out;
   printSummary(out, {recordOf("A", Verdict::kPass), recordOf("B", Verdict::kFail), recordOf("C", Verdict::kPass),
@@ -118,10 +129,62 @@ TEST(PrintUnfiredFaults, PointsOutOnlyThoseThatNeverFired) {
   EXPECT_EQ(out.str(), "quazor: Name: a fault of the phone never fired: {\"operation\":\"b\"}\n");
 }
 
-TEST(PrintList, HasALineForEachDiagnostic) {
+DescribedDiagnostic experimentAlone(const std::string& name) {
+  DescribedDiagnostic described;
+  described.diagnostic.name = described.diagnostic.experimentName = name;
+  described.diagnostic.experimentOnly = true;
+  described.description.experiment = QZDescription("About it.");
+  return described;
+}
+
+std::string listed(const std::vector<DescribedDiagnostic>& diagnostics) {
   std::ostringstream out;
-  printList(out, {{"A.Long", "First.", "", "", nullptr, nullptr}, {"B", "Second.", "", "", nullptr, nullptr}});
-  EXPECT_EQ(out.str(), "A.Long  First.\nB       Second.\n");
+  printList(out, diagnostics);
+  return out.str();
+}
+
+TEST(PrintList, HasALineForEachDiagnostic) {
+  EXPECT_EQ(
+      listed({{{"A.Long", "First.", "", "", nullptr, nullptr}, {}}, {{"B", "Second.", "", "", nullptr, nullptr}, {}}}),
+      "A.Long  First.\nB       Second.\n");
+}
+
+TEST(PrintList, HasExperimentsApart) {
+  DescribedDiagnostic broken = experimentAlone("X.Broken");
+  broken.description.error = hostError(HostErrorCode::kException, "it\033 threw");
+  const std::string experiments =
+      "Experiments that no diagnostic uses; 'quazor experiment NAME' runs one:\n"
+      "  X         About it.\n"
+      "  X.Broken  could not be described: it\\x1b threw\n";
+  EXPECT_EQ(listed({experimentAlone("X"), broken}), experiments);
+  EXPECT_EQ(listed({{{"A", "First.", "", "", nullptr, nullptr}, {}}, experimentAlone("X"), broken}),
+            "A  First.\n\n" + experiments);
+}
+
+TEST(PrintDescriptions, ShowsAnExperimentOnItsOwn) {
+  BoundDiagnostic bound;
+  bound.described = experimentAlone("X");
+  bound.parameters.experiment.push_back({"x", QZNumberParameter("About x.", true), Value(2.5), "profile p.json"});
+  BoundDiagnostic used;
+  used.described = experimentAlone("Y");
+  used.described.diagnostic.usedBy = {"D.One", "D.Two"};
+  std::ostringstream out;
+  printDescriptions(out, {bound, used});
+  EXPECT_EQ(out.str(),
+            "X\n"
+            "  An experiment that no diagnostic uses.\n"
+            "\n"
+            "  Experiment X\n"
+            "    About it.\n"
+            "    Parameter  Value  From            Meaning\n"
+            "    x            2.5  profile p.json  About x.\n"
+            "\n"
+            "Y\n"
+            "  An experiment; used by D.One, D.Two.\n"
+            "\n"
+            "  Experiment Y\n"
+            "    About it.\n"
+            "    It takes no parameters.\n");
 }
 
 TEST(PrintDescriptions, ShowsValuesAndWhereTheyComeFrom) {

@@ -55,6 +55,7 @@ std::unique_ptr<QZExperimentResult> FakeExperiment::run(DiagnosticErrorPtr* erro
   }
   if (behaviour_ == Behaviour::kRunFailsWithoutError) return nullptr;
   if (behaviour_ == Behaviour::kRunThrows) throw std::runtime_error("run threw");
+  if (behaviour_ == Behaviour::kRunThrowsAnInteger) throw 42;
   if (behaviour_ == Behaviour::kRunSucceedsWithError) failWith(error, 3, "an error that is none");
   auto result = std::make_unique<QZExperimentResult>();
   const double value = behaviour_ == Behaviour::kNotANumber ? std::nan("") : measured_;

@@ -24,6 +24,7 @@ enum class Behaviour {
   kTeardownFails = 9,
   kTeardownThrows = 10,
   kRunAndTeardownFail = 11,
+  kRunThrowsAnInteger = 12,
 
   // Of the analysis.
   kAnalysisSetupFails = 20,
