@@ -106,9 +106,14 @@ TEST(ThreadRunLoopTest, AThreadThatWaitsUsesLessThanAThousandthOfAProcessor) {
   RunLoop& loop = currentLoop();
   const auto source = loop.makeSource([] {});
   loop.addSource(source, kRunLoopDefaultMode);
-  const auto before = processorTimeOfThisThread();
-  EXPECT_EQ(loop.runInMode(kRunLoopDefaultMode, kWait, false), RunLoopResult::kTimedOut);
-  EXPECT_LT(processorTimeOfThisThread() - before, kWait / 1000);
+  // On a busy machine a wake-up may cost much; a loop that polls uses too much every time.
+  std::chrono::nanoseconds least = kWait;
+  for (int attempt = 0; attempt < 5 && least >= kWait / 1000; ++attempt) {
+    const auto before = processorTimeOfThisThread();
+    EXPECT_EQ(loop.runInMode(kRunLoopDefaultMode, kWait, false), RunLoopResult::kTimedOut);
+    least = std::min(least, processorTimeOfThisThread() - before);
+  }
+  EXPECT_LT(least, kWait / 1000);
   loop.removeSource(source, kRunLoopDefaultMode);
 }
 
