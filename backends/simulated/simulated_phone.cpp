@@ -79,7 +79,7 @@ SimulatedPhone::SimulatedPhone(const Scenario& scenario, std::shared_ptr<Virtual
   buildVirtual(scenario, std::move(scheduler));
 }
 
-SimulatedPhone::SimulatedPhone(const Scenario& scenario, std::shared_ptr<Clock> clock,
+SimulatedPhone::SimulatedPhone(const Scenario& scenario, const std::shared_ptr<Clock>& clock,
                                std::shared_ptr<Concurrency> concurrency) {
   build(scenario, clock, std::move(concurrency), std::make_shared<ThreadRunLoops>(), sleepForEver(clock));
 }
@@ -95,7 +95,7 @@ void SimulatedPhone::buildVirtual(const Scenario& scenario, std::shared_ptr<Virt
         [scheduler = scheduler_](std::string_view what) { scheduler->stall(what); });
 }
 
-void SimulatedPhone::build(const Scenario& scenario, std::shared_ptr<Clock> clock,
+void SimulatedPhone::build(const Scenario& scenario, const std::shared_ptr<Clock>& clock,
                            std::shared_ptr<Concurrency> concurrency, std::shared_ptr<RunLoops> runLoops,
                            CallInterceptor::Hang hang) {
   calls_ = std::make_shared<CallInterceptor>(scenario.faults, clock, std::move(hang));

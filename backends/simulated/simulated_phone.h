@@ -35,7 +35,8 @@ class SimulatedPhone final {
   // In virtual time, on a scheduler of the caller's choice, so that a test can hand in its own Chooser.
   SimulatedPhone(const Scenario& scenario, std::shared_ptr<VirtualScheduler> scheduler);
   // On a clock and queues of the caller's choice; run loops keep real time. A hang sleeps by that clock, for ever.
-  SimulatedPhone(const Scenario& scenario, std::shared_ptr<Clock> clock, std::shared_ptr<Concurrency> concurrency);
+  SimulatedPhone(const Scenario& scenario, const std::shared_ptr<Clock>& clock,
+                 std::shared_ptr<Concurrency> concurrency);
   SimulatedPhone(const SimulatedPhone&) = delete;
   SimulatedPhone& operator=(const SimulatedPhone&) = delete;
   // The phone's services go on working for those who hold them; tasks that are pending in virtual time are destroyed,
@@ -74,7 +75,7 @@ class SimulatedPhone final {
 
  private:
   void buildVirtual(const Scenario& scenario, std::shared_ptr<VirtualScheduler> scheduler);
-  void build(const Scenario& scenario, std::shared_ptr<Clock> clock, std::shared_ptr<Concurrency> concurrency,
+  void build(const Scenario& scenario, const std::shared_ptr<Clock>& clock, std::shared_ptr<Concurrency> concurrency,
              std::shared_ptr<RunLoops> runLoops, CallInterceptor::Hang hang);
 
   std::shared_ptr<VirtualScheduler> scheduler_;
