@@ -21,14 +21,14 @@ std::string secondsText(double seconds) { return defaultText(std::round(seconds 
 
 }  // namespace
 
-Expectation expectationOf(const BoundParameters& parameters) {
+ExpectedProgress expectedProgressOf(const BoundParameters& parameters) {
   const auto above0 = [&parameters](std::string_view wanted) -> const Value* {
     for (const BoundParameter& one : parameters.experiment) {
       if (one.name == wanted && one.value && toDouble(&*one.value) > 0) return &*one.value;
     }
     return nullptr;
   };
-  Expectation expected;
+  ExpectedProgress expected;
   const Value* const duration = above0("duration");
   const Value* const seconds = duration != nullptr ? duration : above0("timeout");
   if (seconds != nullptr) expected.seconds = toDouble(seconds);
@@ -37,7 +37,7 @@ Expectation expectationOf(const BoundParameters& parameters) {
   return expected;
 }
 
-std::string progressText(const std::string& name, double elapsedSeconds, const Expectation& expected,
+std::string progressText(const std::string& name, double elapsedSeconds, const ExpectedProgress& expected,
                          std::optional<std::uint64_t> frames) {
   std::string text = "Running " + printable(name) + ": " + secondsText(elapsedSeconds);
   if (expected.seconds) text += " of " + secondsText(*expected.seconds);
@@ -45,7 +45,7 @@ std::string progressText(const std::string& name, double elapsedSeconds, const E
   return text;
 }
 
-void Progress::start(const std::string& name, const Expectation& expected) {
+void Progress::start(const std::string& name, const ExpectedProgress& expected) {
   if (terminal_ == nullptr) return;
   {
     const std::lock_guard lock(mutex_);
@@ -77,7 +77,7 @@ void Progress::aside(const std::function<void()>& write) {
   write();
 }
 
-void Progress::show(const std::string& name, const Expectation& expected) {
+void Progress::show(const std::string& name, const ExpectedProgress& expected) {
   const SteadyClock::time_point begin = SteadyClock::now();
   std::unique_lock lock(mutex_);
   for (std::chrono::milliseconds due = kQuietTime;; due += kPeriod) {

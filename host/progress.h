@@ -18,15 +18,15 @@
 namespace quazor {
 
 // What a run is expected to come to; nothing where its parameters do not say.
-struct Expectation {
+struct ExpectedProgress {
   std::optional<double> seconds;        // the experiment's parameter "duration", else its "timeout", if above zero
   std::optional<std::uint64_t> frames;  // the experiment's parameter "frameCount", if 1 or more
 };
 
-Expectation expectationOf(const BoundParameters& parameters);
+ExpectedProgress expectedProgressOf(const BoundParameters& parameters);
 
 // "Running NAME: 1.2 s of 3 s, 36 of 90 frames", without what is not expected or not known.
-std::string progressText(const std::string& name, double elapsedSeconds, const Expectation& expected,
+std::string progressText(const std::string& name, double elapsedSeconds, const ExpectedProgress& expected,
                          std::optional<std::uint64_t> frames);
 
 // Keeps one line of a terminal up to date while something runs, from 0.3 seconds after its beginning on, and erases it
@@ -40,7 +40,7 @@ class Progress {
   ~Progress() { stop(); }
 
   // REQUIRES: nothing is running.
-  void start(const std::string& name, const Expectation& expected);
+  void start(const std::string& name, const ExpectedProgress& expected);
   // Asks `count` for the frames that have come, on a thread of its own, until stop(); it must not use this object.
   void countFrames(std::function<std::uint64_t()> count);
   // When it returns, the line is erased and stays so. Does nothing when nothing is running.
@@ -49,7 +49,7 @@ class Progress {
   void aside(const std::function<void()>& write);
 
  private:
-  void show(const std::string& name, const Expectation& expected);
+  void show(const std::string& name, const ExpectedProgress& expected);
   void erase();
 
   std::ostream* const terminal_;

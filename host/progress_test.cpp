@@ -22,7 +22,7 @@ BoundParameters withParameters(const std::vector<std::pair<std::string, std::opt
 
 TEST(ExpectationOf, TakesTheDurationElseTheTimeout) {
   const auto seconds = [](const std::vector<std::pair<std::string, std::optional<Value>>>& values) {
-    return expectationOf(withParameters(values)).seconds;
+    return expectedProgressOf(withParameters(values)).seconds;
   };
   EXPECT_EQ(seconds({{"timeout", 10}, {"duration", 2.5}}), 2.5);
   EXPECT_EQ(seconds({{"frameCount", 90}, {"timeout", 10}}), 10);
@@ -33,7 +33,7 @@ TEST(ExpectationOf, TakesTheDurationElseTheTimeout) {
 
 TEST(ExpectationOf, TakesTheFrameCount) {
   const auto frames = [](const std::vector<std::pair<std::string, std::optional<Value>>>& values) {
-    return expectationOf(withParameters(values)).frames;
+    return expectedProgressOf(withParameters(values)).frames;
   };
   EXPECT_EQ(frames({{"frameCount", 90}, {"timeout", 10}}), 90U);
   EXPECT_EQ(frames({{"frameCount", 90.9}}), 90U);

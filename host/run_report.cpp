@@ -26,7 +26,7 @@ RunReport::RunReport(ReportOptions options, Console& console)
 void RunReport::begin(const std::string& name, const BoundParameters& parameters) {
   const std::lock_guard lock(mutex_);
   running_ = name;
-  progress_.start(name, expectationOf(parameters));
+  progress_.start(name, expectedProgressOf(parameters));
 }
 
 void RunReport::finish(DiagnosticRecord record) {

@@ -10,7 +10,7 @@ TEST(IsSamples, IsAListOfNumbersOfAnyKind) {
   EXPECT_TRUE(isSamples(Array{-1, 2U, 0.5, 36.6F, true}));
   EXPECT_FALSE(isSamples(Array{}));
   EXPECT_FALSE(isSamples(Array{1, "2"}));
-  EXPECT_FALSE(isSamples(Array{Array{1}}));
+  EXPECT_FALSE(isSamples(Array{Value(Array{1})}));
   EXPECT_FALSE(isSamples(1));
 }
 
