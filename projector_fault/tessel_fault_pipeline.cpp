@@ -4,6 +4,7 @@
 #include "projector_fault/tessel_fault_errors.h"
 #include "projector_fault/tessel_fault_experiment.h"
 
+#include <memory>
 #include <optional>
 #include <utility>
 
@@ -83,8 +84,9 @@ void QZTesselFaultExperiment::_takeIn(std::shared_ptr<QZTesselFaultExperiment> s
     return;
   }
   buffer.release();
-  SerialQueue& processing = *self->_processingQueue;
-  processing.async(Examination{std::move(self), std::move(frame), number});
+  // The task may run, and drop the experiment with its queues, before async returns.
+  const std::shared_ptr<SerialQueue> processing = self->_processingQueue;
+  processing->async(Examination{std::move(self), std::move(frame), number});
 }
 
 void QZTesselFaultExperiment::_examine(const QZTesselFrameDescription& frame, std::uint64_t number) {

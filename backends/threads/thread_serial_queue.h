@@ -14,8 +14,9 @@ namespace quazor {
 // at any time, whatever is waiting or delayed.
 //
 // A posted task costs no allocation of its own, no lock and, while the thread is at work, no system call. An idle
-// thread watches for the next task for up to five microseconds before it sleeps, unless the queue is a background one.
-// The memory of the most tasks that waited is given back within a few tenths of a second without work.
+// thread watches for the next task before it sleeps: for up to five microseconds when tasks have come that soon before,
+// hardly at all when they have not. The memory of the most tasks that waited is given back within a few tenths of a
+// second without work.
 //
 // A delayed task is posted, as if by async, at the moment it becomes due: a task that is posted later runs later, even
 // when the thread was busy at that moment.
