@@ -55,7 +55,7 @@ class HandMadeBuffer final : public PixelBuffer {
   std::function<void()> onRead;
 
  private:
-  FrameKind kind_;
+  std::atomic<FrameKind> kind_;  // whoever renews it may know that nobody uses it, and still not have met them
   std::atomic<int> references_{0};
 };
 

@@ -37,6 +37,7 @@ void HidInbox::schedule(RunLoop& loop, std::string_view mode) {
     const std::lock_guard lock(mutex_);
     if (find(loop, mode) != places_.end()) return;
     places_.push_back({place, source});
+    if (!waiting_.empty()) source->signal();  // what waits for another place may be left to this one
   }
   loop.addSource(source, mode);
 }

@@ -206,6 +206,17 @@ TEST_F(HidInboxTest, WhatOneModeLeavesWaitsForTheOther) {
   inbox_->unschedule(*loop_, "narrow");
 }
 
+TEST_F(HidInboxTest, WhatWaitsIsHandledWhereTheInboxIsScheduledLater) {
+  constexpr std::string_view kOther = "other";
+  inbox_->open();
+  schedule();
+  take(7);
+  inbox_->schedule(*loop_, kOther);
+  unschedule();
+  run(kOther);
+  EXPECT_THAT(seen_, ElementsAre(7));
+}
+
 TEST_F(HidInboxTest, AUserThatIsGoneLeavesNothingInTheLoop) {
   inbox_->open();
   schedule();

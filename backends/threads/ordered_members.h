@@ -54,8 +54,11 @@ class OrderedMembers {
         ++next;
         continue;
       }
-      const std::shared_ptr<Item> item = next->item;
-      act(item);
+      {
+        const std::shared_ptr<Item> item = next->item;
+        act(item);
+      }
+      // Only now that the item may have gone too: its destructor may have added or removed others.
       next = firstBehind(place);
     }
   }

@@ -6,6 +6,7 @@
 #include <functional>
 #include <memory>
 #include <string>
+#include <vector>
 
 namespace quazor {
 namespace {
@@ -130,6 +131,26 @@ TEST(OrderedMembersDestructionTest, TheDestructorOfOneMayRemoveAnother) {
   members.remove(removed);
   EXPECT_EQ(second.use_count(), 1);
   EXPECT_EQ(third.use_count(), 2);
+  members.remove(third.get());
+  EXPECT_TRUE(members.empty());
+}
+
+TEST(OrderedMembersDestructionTest, AnItemThatGoesAfterItsVisitMayRemoveTheNext) {
+  OrderedMembers<Remover> members;
+  std::vector<const Remover*> visited;
+  const auto second = std::make_shared<Remover>(members, nullptr);
+  const auto third = std::make_shared<Remover>(members, nullptr);
+  members.add(std::make_shared<Remover>(members, second), 0, 1);
+  members.add(second, 0, 2);
+  members.add(third, 0, 3);
+  members.visit(
+      3, [](const Remover&) { return true; },
+      [&](const std::shared_ptr<Remover>& item) {
+        visited.push_back(item.get());
+        if (visited.size() == 1) members.remove(item.get());
+      });
+  ASSERT_EQ(visited.size(), 2U);
+  EXPECT_EQ(visited.back(), third.get());
   members.remove(third.get());
   EXPECT_TRUE(members.empty());
 }
