@@ -135,21 +135,21 @@ TEST(OrderedMembersDestructionTest, TheDestructorOfOneMayRemoveAnother) {
   EXPECT_TRUE(members.empty());
 }
 
-TEST(OrderedMembersDestructionTest, AnItemThatGoesAfterItsVisitMayRemoveTheNext) {
+TEST(OrderedMembersDestructionTest, AnItemThatGoesAfterItsVisitMayRemoveOneBeforeIt) {
   OrderedMembers<Remover> members;
   std::vector<const Remover*> visited;
-  const auto second = std::make_shared<Remover>(members, nullptr);
+  const auto first = std::make_shared<Remover>(members, nullptr);
   const auto third = std::make_shared<Remover>(members, nullptr);
-  members.add(std::make_shared<Remover>(members, second), 0, 1);
-  members.add(second, 0, 2);
+  members.add(first, 0, 1);
+  members.add(std::make_shared<Remover>(members, first), 0, 2);
   members.add(third, 0, 3);
   members.visit(
       3, [](const Remover&) { return true; },
       [&](const std::shared_ptr<Remover>& item) {
         visited.push_back(item.get());
-        if (visited.size() == 1) members.remove(item.get());
+        if (visited.size() == 2) members.remove(item.get());
       });
-  ASSERT_EQ(visited.size(), 2U);
+  ASSERT_EQ(visited.size(), 3U);
   EXPECT_EQ(visited.back(), third.get());
   members.remove(third.get());
   EXPECT_TRUE(members.empty());
