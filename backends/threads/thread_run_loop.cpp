@@ -2,6 +2,7 @@
 
 #include "backends/threads/basic_run_loop.h"
 #include "backends/threads/parker.h"
+#include "backends/threads/watch.h"
 
 #include <atomic>
 #include <chrono>
@@ -16,6 +17,7 @@ class ThreadWaiter final : public RunLoopWaiter {
   std::chrono::nanoseconds now() override { return std::chrono::steady_clock::now().time_since_epoch(); }
 
   void wait(std::chrono::nanoseconds deadline, const std::function<bool()>& ready) override {
+    if (watch_.lookOut(ready, [this] { return now(); }, deadline)) return;
     for (;;) {
       parker_.prepare();
       // Whoever changes what `ready` asks for and finds no sleeper did so before `ready` is asked here.
@@ -31,6 +33,7 @@ class ThreadWaiter final : public RunLoopWaiter {
   }
 
  private:
+  Watch watch_;
   Parker parker_;
   std::atomic<bool> asleep_{false};
 };

@@ -9,7 +9,7 @@ namespace quazor {
 // when the thread ends.
 //
 // A signal and a stop take no lock, and make a system call only when the loop's thread sleeps. A thread with nothing to
-// do sleeps until it is woken or its time limit comes.
+// do sleeps until it is woken or its time limit comes; one that is woken often looks out for a moment before it sleeps.
 class ThreadRunLoops final : public RunLoops {
  public:
   // Never null.

@@ -1,0 +1,80 @@
+#include "backends/threads/watch.h"
+
+#include <gtest/gtest.h>
+
+#include <chrono>
+#include <vector>
+
+namespace quazor {
+namespace {
+
+using namespace std::chrono_literals;
+
+constexpr std::chrono::nanoseconds kNever = std::chrono::nanoseconds::max();
+
+// A clock that goes on by 10 microseconds each time it is read.
+class WatchTest : public testing::Test {
+ protected:
+  // True when the watch asked at least once; `ready` is what it got as an answer.
+  bool looks(bool ready, std::chrono::nanoseconds deadline = kNever) {
+    bool asked = false;
+    succeeded_ = watch_.lookOut(
+        [&] {
+          asked = true;
+          return ready;
+        },
+        [this] { return now_ += 10us; }, deadline);
+    return asked;
+  }
+
+  // How many look-outs in a row are left out before the next one, which is in vain.
+  int leftOut() {
+    int count = 0;
+    while (!looks(false)) ++count;
+    return count;
+  }
+
+  Watch watch_;
+  std::chrono::nanoseconds now_{};
+  bool succeeded_ = false;
+};
+
+TEST_F(WatchTest, SeesAtOnceWhatIsReady) {
+  EXPECT_TRUE(looks(true));
+  EXPECT_TRUE(succeeded_);
+  EXPECT_EQ(now_, 10us);
+}
+
+TEST_F(WatchTest, SeesWhatBecomesReadyMeanwhile) {
+  EXPECT_TRUE(watch_.lookOut([this] { return now_ >= 30us; }, [this] { return now_ += 10us; }, kNever));
+}
+
+TEST_F(WatchTest, EndsAfterItsLongestTime) {
+  EXPECT_TRUE(looks(false));
+  EXPECT_FALSE(succeeded_);
+  EXPECT_EQ(now_, 10us + Watch::kLongest);
+}
+
+TEST_F(WatchTest, EndsAtTheDeadline) {
+  EXPECT_TRUE(looks(false, 20us));
+  EXPECT_FALSE(succeeded_);
+  EXPECT_EQ(now_, 20us);
+}
+
+TEST_F(WatchTest, LeavesOutTwiceAsManyAfterEachOneInVainUpToAThousand) {
+  std::vector<int> counts;
+  for (int i = 0; i < 14; ++i) counts.push_back(leftOut());
+  EXPECT_EQ(counts, (std::vector<int>{0, 1, 2, 4, 8, 16, 32, 64, 128, 256, 512, 1024, 1024, 1024}));
+}
+
+TEST_F(WatchTest, LooksOutEachTimeAsLongAsItSucceeds) {
+  for (int i = 0; i < 5; ++i) leftOut();
+  while (!looks(true)) {
+  }
+  for (int i = 0; i < 100; ++i) ASSERT_TRUE(looks(true));
+  EXPECT_EQ(leftOut(), 0);
+  EXPECT_EQ(leftOut(), 1) << "after a success the count begins again";
+}
+
+}  // namespace
+}  // namespace quazor
