@@ -3,7 +3,7 @@
 
 usage: run.py DIRECTORY PLUG-IN
 
-DIRECTORY holds the benchmark programs. Every program runs its benchmarks several times, in random order, so that
+DIRECTORY holds the benchmark programs, in a build directory. Every program runs its benchmarks several times, in random order, so that
 what else the machine does meets all of them alike; the medians are compared. A requirement that could not be measured
 counts as missed. Exit code 0: all requirements are met; 1: one is missed; 2: wrong use.
 """
@@ -12,6 +12,9 @@ import json
 import os
 import subprocess
 import sys
+
+from isolation import check_isolation, measure as measure_isolation
+from requirements import Requirements
 
 REPETITIONS = 7
 PEERS = ("asio strand", "asio pool", "tbb node")
@@ -37,22 +40,6 @@ def run(directory, program, *arguments):
         if entry.get("aggregate_name") == "median":
             medians[entry["run_name"]] = entry
     return medians
-
-
-class Requirements:
-    """Prints each comparison and remembers whether one was missed."""
-
-    def __init__(self):
-        self.missed = 0
-
-    def check(self, text, measured):
-        """`measured` is a function that returns (met, figures); without a figure it raises KeyError."""
-        try:
-            met, figures = measured()
-        except KeyError as missing:
-            met, figures = False, f"not measured: {missing}"
-        self.missed += 0 if met else 1
-        print(f"  {'PASS' if met else 'FAIL'}  {text}: {figures}")
 
 
 def check_serial_queue(requirements, medians):
@@ -177,12 +164,12 @@ def main():
         (check_load, run(directory, "load_benchmark", plugin, os.path.join(directory, "empty_shared_object.so"))),
         (check_pipeline, run(directory, "projector_pipeline_benchmark")),
         (check_channels, run(directory, "report_channels_benchmark")),
+        (check_isolation, measure_isolation(os.path.dirname(os.path.abspath(directory)))),
     )
     requirements = Requirements()
     for check, medians in results:
         check(requirements, medians)
-    print("all requirements are met" if requirements.missed == 0 else f"{requirements.missed} requirements are missed")
-    return 0 if requirements.missed == 0 else 1
+    return requirements.exit_code()
 
 
 if __name__ == "__main__":

@@ -1,7 +1,4 @@
-"""The program as its users meet it: every kind of bad input, its outputs and its exit codes.
-
-CTest gives the program and the directory of the test plug-ins in the environment.
-"""
+"""The program as its users meet it: every kind of bad input, its outputs and its exit codes."""
 
 import csv
 import io
@@ -10,62 +7,11 @@ import os
 import pathlib
 import pty
 import re
-import signal
 import subprocess
-import tempfile
-import time
 import unittest
 
-PROGRAM = os.environ["QUAZOR_PROGRAM"]
-PLUGINS = pathlib.Path(os.environ["QUAZOR_TEST_PLUGINS"])
-WORKING = str(PLUGINS / "working_plugin.so")
-EXPERIMENTS = str(PLUGINS / "experiments_plugin.so")
-
-SCENARIO = {
-    "title": "One camera",
-    "cameras": {"wide": {"port": "BackFacingCamera", "formats": [{"maximumFrameRate": 30}]}},
-    "groups": {"back": {"cameras": ["wide"], "master": "wide"}},
-    "faults": [],
-}
-UNFIRED_FAULT = {"operation": "CaptureStream.start", "action": "fail"}
-
-
-def quazor(*arguments, **options):
-    environment = {key: value for key, value in os.environ.items() if key not in ("NO_COLOR", "TERM")}
-    environment.update(options.pop("env", {}))
-    return subprocess.run([PROGRAM, *map(str, arguments)], capture_output=True, text=True, timeout=120,
-                          env=environment, **options)
-
-
-class CommandLineTest(unittest.TestCase):
-    def setUp(self):
-        directory = tempfile.TemporaryDirectory()
-        self.addCleanup(directory.cleanup)
-        self.directory = pathlib.Path(directory.name)
-        self.phone = self.write("phone.json", json.dumps(SCENARIO))
-        self.output = self.directory / "out.json"
-
-    def write(self, name, content):
-        path = self.directory / name
-        path.write_text(content)
-        return path
-
-    def run_fake(self, *arguments, names=("Fake.One",), duration=1, **options):
-        """Runs the fake diagnostic, which passes unless the arguments say otherwise."""
-        fixed = ["--plugin", WORKING, "--phone", self.phone, "--profile", "none"]
-        if duration is not None:
-            fixed += ["--set", f"duration={duration}"]
-        return quazor("run", *names, *fixed, *arguments, **options)
-
-    def assert_refused(self, result, code, *texts):
-        """The exit code, every text on standard error, nothing on standard output, and nothing touched."""
-        self.assertEqual(result.returncode, code, result.stderr)
-        self.assertTrue(result.stderr.startswith("quazor: "), result.stderr)
-        for text in texts:
-            self.assertIn(text, result.stderr)
-        self.assertEqual(result.stdout, "")
-        self.assertFalse(self.output.exists())
-        self.assertEqual([path.name for path in self.directory.glob("*.tmp")], [])
+from command_line_fixture import (EXPERIMENTS, PLUGINS, PROGRAM, SCENARIO, UNFIRED_FAULT, WORKING, CommandLineTest,
+                                  quazor)
 
 
 class HelpTest(CommandLineTest):
@@ -397,19 +343,24 @@ class RunTest(CommandLineTest):
         self.assertEqual((result.returncode, result.stdout.splitlines()[0]), (0, "PASS  Fake.One"))
         self.assertEqual(json.loads(self.output.read_text())["diagnostics"][0]["verdict"], "pass")
 
-    def test_an_output_file_that_cannot_be_written(self):
-        path = self.directory / "nowhere" / "out"
-        result = self.run_fake("--output", path, "--set", "minimum=1")
+    def test_an_output_file_that_cannot_be_written_is_refused_before_anything_runs(self):
+        rows = {self.directory / "nowhere" / "out": "No such file or directory", self.directory: "it is a directory",
+                self.phone / "out": "Not a directory"}
+        for path, why in rows.items():
+            for output in (path, f"junit:{path}"):
+                with self.subTest(output):
+                    self.assert_refused(self.run_fake("--output", output), 73,
+                                        f"the output file '{path}' cannot be written: {why}")
+
+    def test_an_output_file_that_turns_out_not_to_be_writable(self):
+        result = self.run_fake("--output", "/dev/full", "--set", "minimum=1")
         self.assertEqual(result.returncode, 73)
-        self.assertIn(f"the output file '{path}' cannot be written: No such file or directory", result.stderr)
+        self.assertIn("the output file '/dev/full' cannot be written: No space left on device", result.stderr)
         self.assertIn("FAIL  Fake.One", result.stdout)
 
     def test_a_standard_output_that_is_full(self):
         with open("/dev/full", "w") as full:
-            arguments = ["run", "Fake.One", "--plugin", WORKING, "--phone", self.phone, "--profile", "none", "--set",
-                         "duration=1"]
-            result = subprocess.run([PROGRAM, *map(str, arguments)], stdout=full, stderr=subprocess.PIPE, text=True,
-                                    timeout=120)
+            result = self.run_fake(stdout=full)
         self.assertEqual(result.returncode, 73)
         self.assertIn("the standard output cannot be written", result.stderr)
 
@@ -511,11 +462,10 @@ class ExperimentTest(CommandLineTest):
         self.assertEqual(self.output.read_text(),
                          "experiment,measurement,value,unit\nAlone.Counts,Count,0,frames\n")
 
-    def test_csv_is_for_experiments_only(self):
-        for command in (["run", "Fake.One"], ["list"], ["describe", "Fake.One"]):
+    def test_csv_is_for_runs_only(self):
+        for command in (["list"], ["describe", "Fake.One"]):
             result = quazor(*command, "--plugin", WORKING, "--format", "csv", "--output", self.output)
-            self.assert_refused(result, 64, "--format csv is for 'quazor experiment'",
-                                f"'{command[0]}' gives its report as text or json")
+            self.assert_refused(result, 64, "--format: csv not in {text,json}")
 
     def test_an_error_beside_a_csv_table(self):
         result = self.run_counts("--format", "csv", "--set", "behaviour=5")
@@ -627,40 +577,6 @@ class TerminalTest(CommandLineTest):
         self.assertEqual(counts, sorted(set(counts)))
         self.assertGreater(counts[0], 0)
         self.assertLessEqual(counts[-1], 25)
-
-
-class InterruptTest(CommandLineTest):
-    def interrupted(self, *arguments):
-        """Runs one diagnostic that passes at once and one that takes too long, and interrupts the second."""
-        command = [PROGRAM, "run", "Broken.Nothing", "Fake.One", "--plugin", WORKING, "--phone", str(self.phone),
-                   "--profile", "none", "--realtime", "--set", "duration=60", *map(str, arguments)]
-        # A test that runs in a shell's background has interrupts ignored, and would hand that on.
-        process = subprocess.Popen(command, stdout=subprocess.PIPE, stderr=subprocess.PIPE, text=True,
-                                   preexec_fn=lambda: signal.signal(signal.SIGINT, signal.SIG_DFL))
-        self.addCleanup(process.kill)
-        line = process.stderr.readline()  # the run's first log line: it is in the second diagnostic
-        self.assertIn("an error line", line)
-        begin = time.monotonic()
-        process.send_signal(signal.SIGINT)
-        out, err = process.communicate(timeout=30)
-        self.assertLess(time.monotonic() - begin, 20)
-        self.assertEqual(process.returncode, 130)
-        self.assertIn("interrupted while Fake.One was running", err)
-        return out
-
-    def test_json_stays_one_document_with_what_was_finished(self):
-        document = json.loads(self.interrupted("--format", "json"))
-        self.assertEqual([record["name"] for record in document["diagnostics"]], ["Broken.Nothing"])
-        self.assertEqual(document["interrupted"], "Fake.One")
-
-    def test_text_shows_what_was_finished(self):
-        out = self.interrupted()
-        self.assertIn("Broken.Nothing", out)
-        self.assertIn("1 diagnostic: 0 passed, 0 failed, 1 ended in an error", out)
-
-    def test_the_output_file_is_written(self):
-        self.interrupted("--format", "json", "--output", self.output)
-        self.assertEqual(json.loads(self.output.read_text())["interrupted"], "Fake.One")
 
 
 if __name__ == "__main__":

@@ -76,6 +76,39 @@ void appendLine(std::string& csv, const std::vector<std::string_view>& fields) {
   csv += '\n';
 }
 
+const std::vector<std::string_view> kDiagnosticColumns = {
+    "diagnostic", "verdict",   "result",        "value",      "unit",        "limit",     "lower",       "lowerOpen",
+    "upper",      "upperOpen", "resultVerdict", "errorStage", "errorDomain", "errorCode", "errorMessage"};
+
+// The four cells of a limit's bounds, and its name before them.
+void addLimit(std::vector<std::string>& cells, const std::optional<QZLimit>& limit) {
+  cells.push_back(limit ? limit->name() : std::string());
+  for (const auto which : {&QZLimit::lowerBound, &QZLimit::upperBound}) {
+    const QZBound* const bound = limit ? ((*limit).*which)().get() : nullptr;
+    cells.push_back(bound == nullptr ? std::string() : defaultText(bound->value().value()));
+    cells.push_back(bound == nullptr ? std::string() : defaultText(bound->open()));
+  }
+}
+
+// A line of the diagnostic; `judged` is null for one without results.
+void appendDiagnosticLine(std::string& csv, const DiagnosticRecord& record, const JudgedResult* judged) {
+  std::vector<std::string> cells{record.name, std::string(nameOf(record.verdict))};
+  if (judged != nullptr) {
+    const Measurement& measurement = judged->result.measurement();
+    cells.insert(cells.end(), {judged->result.name(), defaultText(measurement.value()), measurement.unit().symbol()});
+    addLimit(cells, judged->result.limit());
+    cells.emplace_back(nameOf(judged->verdict));
+  } else {
+    cells.resize(kDiagnosticColumns.size() - 4);
+  }
+  if (const DiagnosticErrorPtr& error = record.error; error != nullptr) {
+    cells.emplace_back(record.errorStage ? nameOf(*record.errorStage) : std::string_view());
+    cells.insert(cells.end(), {error->domain(), std::to_string(error->code()), error->localizedDescription()});
+  }
+  cells.resize(kDiagnosticColumns.size());
+  appendLine(csv, {cells.begin(), cells.end()});
+}
+
 }  // namespace
 
 std::string csvField(std::string_view text) {
@@ -107,6 +140,16 @@ std::string experimentCsv(const std::vector<DiagnosticRecord>& records) {
     }
     appendLine(csv, fields);
   });
+  return csv;
+}
+
+std::string diagnosticCsv(const std::vector<DiagnosticRecord>& records) {
+  std::string csv;
+  appendLine(csv, kDiagnosticColumns);
+  for (const DiagnosticRecord& record : records) {
+    for (const JudgedResult& judged : record.measuredResults) appendDiagnosticLine(csv, record, &judged);
+    if (record.measuredResults.empty()) appendDiagnosticLine(csv, record, nullptr);
+  }
   return csv;
 }
 

@@ -1,7 +1,7 @@
-// The results of experiments as a table of comma-separated values. docs/csv_output.md is the public description.
+// Results as a table of comma-separated values. docs/csv_output.md is the public description.
 #pragma once
 
-#include "host/diagnostic_run.h"
+#include "host/diagnostic_record.h"
 
 #include <string>
 #include <string_view>
@@ -16,5 +16,8 @@ std::string csvField(std::string_view text);
 // A header line, then a line for each sample of each image and a line for each measurement, in the order of the
 // records.
 std::string experimentCsv(const std::vector<DiagnosticRecord>& records);
+
+// A header line, then a line for each measured result, and one for each diagnostic without any.
+std::string diagnosticCsv(const std::vector<DiagnosticRecord>& records);
 
 }  // namespace quazor

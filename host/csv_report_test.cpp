@@ -84,5 +84,41 @@ TEST(ExperimentCsv, IsAHeaderAloneWhenNothingWasMeasured) {
   EXPECT_EQ(experimentCsv({experimentOf("X", {{"images", Array{}}})}), "experiment,measurement,value,unit\n");
 }
 
+constexpr const char* kDiagnosticHeader =
+    "diagnostic,verdict,result,value,unit,limit,lower,lowerOpen,upper,upperOpen,resultVerdict,"
+    "errorStage,errorDomain,errorCode,errorMessage\n";
+
+TEST(DiagnosticCsv, HasALineForEachResult) {
+  DiagnosticRecord record = recordOf("D, 1", Verdict::kFail);
+  QZMeasuredResult both("Both", Measurement(std::numeric_limits<double>::quiet_NaN(), QZDimensionlessUnit::errors()));
+  QZLimit limit("A \"range\"");
+  limit.setLowerBound(std::make_shared<const QZBound>(Measurement(0.5, QZDimensionlessUnit::errors()), true));
+  limit.setUpperBound(std::make_shared<const QZBound>(Measurement(2, QZDimensionlessUnit::errors()), false));
+  both.setLimit(limit);
+  record.measuredResults.push_back({both, ResultVerdict::kPass});
+  EXPECT_EQ(diagnosticCsv({record, recordOf("D2", Verdict::kPass)}),
+            std::string(kDiagnosticHeader) +
+                "\"D, 1\",fail,Count,89,frames,Enough,90,0,,,fail,,,,\n"
+                "\"D, 1\",fail,Offset,0.5,events,,,,,,none,,,,\n"
+                "\"D, 1\",fail,Both,nan,errors,\"A \"\"range\"\"\",0.5,1,2,0,pass,,,,\n"
+                "D2,pass,Count,90,frames,Enough,90,0,,,pass,,,,\n"
+                "D2,pass,Offset,0.5,events,,,,,,none,,,,\n");
+}
+
+TEST(DiagnosticCsv, HasTheErrorOnEachLine) {
+  DiagnosticRecord record = recordOf("D", Verdict::kError);
+  record.errorStage = Stage::kTeardown;
+  EXPECT_EQ(diagnosticCsv({record}), std::string(kDiagnosticHeader) +
+                                         "D,error,Count,90,frames,Enough,90,0,,,pass,teardown,Domain,-1,it failed\n"
+                                         "D,error,Offset,0.5,events,,,,,,none,teardown,Domain,-1,it failed\n");
+}
+
+TEST(DiagnosticCsv, HasALineForADiagnosticWithoutResults) {
+  DiagnosticRecord record = recordOf("D", Verdict::kError);
+  record.measuredResults.clear();
+  EXPECT_EQ(diagnosticCsv({record}), std::string(kDiagnosticHeader) + "D,error,,,,,,,,,,,Domain,-1,it failed\n");
+  EXPECT_EQ(diagnosticCsv({}), kDiagnosticHeader);
+}
+
 }  // namespace
 }  // namespace quazor

@@ -1,9 +1,11 @@
 #include "host/diagnostic_run.h"
 
-#include "backends/threads/recording_log.h"
 #include "frame/log_channel.h"
-#include "host/idle_platform.h"
+#include "host/record_builder.h"
+#include "host/test_events.h"
+#include "host/test_phone.h"
 #include "host/test_plugins/fake_diagnostic.h"
+#include "platform/platform.h"
 
 #include <gmock/gmock.h>
 #include <gtest/gtest.h>
@@ -20,30 +22,6 @@ using namespace std::chrono_literals;
 using fake::Behaviour;
 using testing::ElementsAre;
 
-class ManualClock final : public Clock {
- public:
-  std::chrono::nanoseconds now() const override { return time; }
-  Date date() const override { return Date(time); }
-  void sleep(std::chrono::nanoseconds duration) override { time += duration; }
-
-  std::chrono::nanoseconds time = 7s;
-};
-
-// A phone on which only time passes.
-class TestPhone final : public Phone {
- public:
-  Platform platform() const override {
-    Platform platform = idlePlatform();
-    platform.clock = clock_;
-    return platform;
-  }
-  std::vector<DeclaredFault> faults() const override { return {{{{"operation", "x"}}, 3}}; }
-  std::uint64_t framesDelivered() const override { return 17; }
-
- private:
-  std::shared_ptr<Clock> clock_ = std::make_shared<ManualClock>();
-};
-
 class DiagnosticRunTest : public testing::Test {
  protected:
   DiagnosticRunTest() {
@@ -57,14 +35,32 @@ class DiagnosticRunTest : public testing::Test {
       ++phonesMade_;
       return std::make_unique<TestPhone>();
     };
-    options_.seed = 42;
   }
 
   DiagnosticRecord run(const std::vector<std::string>& texts = {"duration=2", "measured=90", "minimum=90"}) {
+    const BoundParameters parameters = boundTo(texts);
+    events_.events.clear();
+    DiagnosticBegan began = beginningOf("Fake");
+    began.experimentOnly = diagnostic_.diagnostic.experimentOnly;
+    events_.take(began);
+    runDiagnostic(diagnostic_.diagnostic, parameters, options_, events_);
+    return recordOfEvents();
+  }
+
+  BoundParameters boundTo(const std::vector<std::string>& texts) {
     diagnostic_.description = describeDiagnostic(diagnostic_.diagnostic);
     std::vector<Setting> settings;
     for (const std::string& text : texts) settings.push_back(parseSetting(text));
-    return runDiagnostic(diagnostic_, bindParameters(diagnostic_, nullptr, settings), options_);
+    return bindParameters(diagnostic_, {}, settings);
+  }
+
+  // What the events come to when the host closes them.
+  DiagnosticRecord recordOfEvents() const {
+    RecordBuilder builder;
+    for (const RunEvent& event : events_.events) builder.take(event);
+    EXPECT_TRUE(builder.isCompleted());
+    for (const RunEvent& event : builder.ending(momentAt(99))) builder.take(event);
+    return builder.takeRecord();
   }
 
   DiagnosticRecord runWith(Behaviour behaviour) {
@@ -73,6 +69,7 @@ class DiagnosticRunTest : public testing::Test {
 
   DescribedDiagnostic diagnostic_;
   RunOptions options_;
+  EventList events_;
   int phonesMade_ = 0;
 };
 
@@ -83,11 +80,8 @@ std::string textOf(const DiagnosticErrorPtr& error) {
 
 TEST_F(DiagnosticRunTest, RecordsARunThatPasses) {
   const DiagnosticRecord record = run();
-  EXPECT_EQ(record.name, "Fake");
-  EXPECT_EQ(record.summary, "Summary.");
   EXPECT_EQ(record.verdict, Verdict::kPass);
   EXPECT_EQ(record.error, nullptr);
-  EXPECT_EQ(record.seed, 42U);
   ASSERT_EQ(record.measuredResults.size(), 2U);
   EXPECT_EQ(record.measuredResults[0].result.name(), "Count");
   EXPECT_EQ(record.measuredResults[0].verdict, ResultVerdict::kPass);
@@ -96,7 +90,43 @@ TEST_F(DiagnosticRunTest, RecordsARunThatPasses) {
   EXPECT_EQ(*record.auxiliaryData.find("bytes"), Value(Bytes{0x00, 0xA5}));
   ASSERT_EQ(record.faults.size(), 1U);
   EXPECT_EQ(record.faults[0].fired, 3U);
-  EXPECT_EQ(dictionaryOf(record.parameters.experiment), (Dictionary{{"duration", 2}, {"measured", 90}}));
+}
+
+TEST_F(DiagnosticRunTest, TellsEachStageWithItsBeginningAndEnd) {
+  run();
+  EXPECT_EQ(namesOf(events_.events),
+            "diagnosticBegan stageBegan stageEnded stageBegan stageEnded stageBegan log log stageEnded measured "
+            "collected collected stageBegan log stageEnded stageBegan stageEnded found faultsCounted "
+            "diagnosticCompleted");
+  std::vector<Stage> stages;
+  std::optional<Stage> open;
+  for (const RunEvent& event : events_.events) {
+    if (const auto* const began = std::get_if<StageBegan>(&event)) {
+      EXPECT_EQ(open, std::nullopt);
+      open = began->stage;
+      stages.push_back(began->stage);
+    } else if (const auto* const ended = std::get_if<StageEnded>(&event)) {
+      EXPECT_EQ(open, ended->stage);
+      open.reset();
+    }
+  }
+  EXPECT_EQ(open, std::nullopt);
+  EXPECT_THAT(stages, ElementsAre(Stage::kDescribe, Stage::kSetup, Stage::kRun, Stage::kTeardown, Stage::kAnalyse));
+}
+
+TEST_F(DiagnosticRunTest, DatesEverythingByTheWallClock) {
+  const auto before = std::chrono::system_clock::now();
+  const DiagnosticRecord record = run();
+  const auto after = std::chrono::system_clock::now();
+  for (const StagePeriod& stage : record.stages) {
+    EXPECT_LE(before, stage.begin);
+    EXPECT_LE(stage.begin, stage.end);
+    EXPECT_LE(*stage.end, after);
+  }
+  for (const LogLine& line : record.log) {
+    EXPECT_LE(before, line.date);
+    EXPECT_LE(line.date, after);
+  }
 }
 
 TEST_F(DiagnosticRunTest, FailsOutsideALimit) {
@@ -130,19 +160,12 @@ TEST_F(DiagnosticRunTest, KeepsTheLogLinesOfTheChosenLevel) {
   EXPECT_EQ(record.log[2].time, 2s);
 }
 
-TEST_F(DiagnosticRunTest, LetsListenersHearTheRun) {
-  const auto heard = std::make_shared<RecordingLog>();
-  options_.makeListeners = [&heard](const std::shared_ptr<Clock>& clock) {
-    EXPECT_EQ(clock->now(), 7s);
-    return std::vector<RunLog::Listener>{{heard, LogLevel::kError}};
-  };
-  run();
-  EXPECT_EQ(heard->records().size(), 1U);
-}
-
 TEST_F(DiagnosticRunTest, ClosesTheLogAfterwards) {
   run();
   EXPECT_FALSE(LogChannel::isEnabled(LogLevel::kError));
+  const std::size_t told = events_.events.size();
+  logError("too late");
+  EXPECT_EQ(events_.events.size(), told);
 }
 
 TEST_F(DiagnosticRunTest, LetsThePhoneOfARunBeWatched) {
@@ -174,8 +197,6 @@ class ExperimentRunTest : public DiagnosticRunTest {
 TEST_F(ExperimentRunTest, RecordsWhatAnExperimentMeasuresAndJudgesNothing) {
   const DiagnosticRecord record = runAlone(Behaviour::kNormal);
   EXPECT_TRUE(record.experimentOnly);
-  EXPECT_EQ(record.name, "FakeExperiment");
-  EXPECT_EQ(record.summary, "Measures what it is told to.");
   EXPECT_EQ(record.verdict, Verdict::kPass);
   EXPECT_EQ(record.error, nullptr);
   EXPECT_EQ(*record.measurements.find("Count"), Measurement(90, QZDimensionlessUnit::frames()));
@@ -299,12 +320,23 @@ TEST_F(DiagnosticRunTest, KeepsTheUnderlyingError) {
   EXPECT_EQ(textOf(record.error->underlyingError()), "DeepDomain -3 the cause");
 }
 
-TEST_F(DiagnosticRunTest, DoesNotRunWhatCannotBeDescribed) {
+TEST_F(DiagnosticRunTest, EndsInAnErrorWhenNothingIsMade) {
   diagnostic_.diagnostic.makeExperiment = [] { return nullptr; };
   const DiagnosticRecord record = run({});
   EXPECT_EQ(record.verdict, Verdict::kError);
   EXPECT_EQ(textOf(record.error), "QuazorHostErrorDomain 3 the factory of FakeExperiment made nothing");
-  EXPECT_EQ(phonesMade_, 0);
+  EXPECT_EQ(record.errorStage, Stage::kDescribe);
+  EXPECT_EQ(record.durations.setup, std::nullopt);
+}
+
+TEST_F(DiagnosticRunTest, EndsInAnErrorWhenADescriptionThrows) {
+  class Undescribable final : public fake::FakeExperiment {
+   public:
+    QZDescription experimentDescription() const override { throw std::runtime_error("description threw"); }
+  };
+  diagnostic_.diagnostic.makeExperiment = [] { return std::make_shared<Undescribable>(); };
+  EXPECT_EQ(textOf(run({}).error),
+            "QuazorHostErrorDomain 2 describing FakeExperiment threw an exception: description threw");
 }
 
 TEST_F(DiagnosticRunTest, EndsInAnErrorWhenAFactoryFailsOnlyForTheRun) {
@@ -316,6 +348,7 @@ TEST_F(DiagnosticRunTest, EndsInAnErrorWhenAFactoryFailsOnlyForTheRun) {
   const DiagnosticRecord record = run();
   EXPECT_EQ(record.verdict, Verdict::kError);
   EXPECT_EQ(textOf(record.error), "QuazorHostErrorDomain 3 the factory of FakeAnalysis made nothing");
+  EXPECT_EQ(record.errorStage, Stage::kAnalyse);
   EXPECT_EQ(record.measurements.size(), 1U);
 }
 
@@ -325,13 +358,127 @@ TEST_F(DiagnosticRunTest, MakesANewExperimentOnThePhonesPlatform) {
     clockSeen = installedPlatform().clock.get();
     return std::make_shared<fake::FakeExperiment>();
   };
-  std::shared_ptr<Clock> clockOfRun;
-  options_.makeListeners = [&clockOfRun](const std::shared_ptr<Clock>& clock) {
-    clockOfRun = clock;
-    return std::vector<RunLog::Listener>();
+  const Clock* clockOfRun = nullptr;
+  options_.watchPhone = [&clockOfRun](const std::shared_ptr<const Phone>& phone) {
+    clockOfRun = phone->platform().clock.get();
   };
   run();
-  EXPECT_EQ(clockSeen, clockOfRun.get());
+  ASSERT_NE(clockOfRun, nullptr);
+  EXPECT_EQ(clockSeen, clockOfRun);
+  EXPECT_NE(installedPlatform().clock.get(), clockOfRun);
+}
+
+// Gives so many measurements, and so many results of them.
+class LargeDiagnosticTest : public DiagnosticRunTest {
+ protected:
+  class LargeExperiment final : public fake::FakeExperiment {
+   public:
+    explicit LargeExperiment(int count) : count_(count) {}
+
+    std::unique_ptr<QZExperimentResult> run(DiagnosticErrorPtr* /*error*/) override {
+      auto result = std::make_unique<QZExperimentResult>();
+      for (int i = 0; i < count_; ++i) {
+        result->measurements().set(std::to_string(i), Measurement(i, QZDimensionlessUnit::frames()));
+      }
+      return result;
+    }
+
+   private:
+    const int count_;
+  };
+
+  class LargeAnalysis final : public QZAnalysis {
+   public:
+    QZDescription analysisDescription() const override { return QZDescription(""); }
+    std::unique_ptr<QZAnalysisResult> analyzeExperimentResult(const QZExperimentResult& result,
+                                                              DiagnosticErrorPtr* /*error*/) override {
+      auto analysed = std::make_unique<QZAnalysisResult>();
+      for (const auto& [name, measurement] : result.measurements()) {
+        analysed->measuredResults().emplace_back(name, measurement);
+      }
+      return analysed;
+    }
+  };
+
+  DiagnosticRecord runLarge(int count) {
+    diagnostic_.diagnostic.makeExperiment = [count] { return std::make_shared<LargeExperiment>(count); };
+    diagnostic_.diagnostic.makeAnalysis = [] { return std::make_shared<LargeAnalysis>(); };
+    return run({});
+  }
+
+  template <class Event>
+  std::size_t count() const {
+    std::size_t count = 0;
+    for (const RunEvent& event : events_.events) count += std::holds_alternative<Event>(event) ? 1 : 0;
+    return count;
+  }
+};
+
+TEST_F(LargeDiagnosticTest, TellsManyMeasurementsAndResultsInSeveralEvents) {
+  struct Row {
+    int measurements;
+    std::size_t events;
+  };
+  for (const auto& [measurements, events] : {Row{0, 0}, Row{1, 1}, Row{500, 1}, Row{501, 2}, Row{1201, 3}}) {
+    const DiagnosticRecord record = runLarge(measurements);
+    EXPECT_EQ(count<Measured>(), events) << measurements;
+    EXPECT_EQ(count<Found>(), events) << measurements;
+    ASSERT_EQ(record.measurements.size(), static_cast<std::size_t>(measurements));
+    ASSERT_EQ(record.measuredResults.size(), static_cast<std::size_t>(measurements));
+    int i = 0;
+    for (const auto& [name, measurement] : record.measurements) {
+      EXPECT_EQ(measurement.value(), i);
+      EXPECT_EQ(record.measuredResults[static_cast<std::size_t>(i)].result.name(), std::to_string(i));
+      ++i;
+    }
+  }
+}
+
+class AnalyseResultTest : public DiagnosticRunTest {
+ protected:
+  DiagnosticRecord analyse(const std::vector<std::string>& texts, LogLevel level = LogLevel::kDefault) {
+    QZExperimentResult result;
+    result.measurements().set("Count", Measurement(90, QZDimensionlessUnit::frames()));
+    result.auxiliaryData().set("bytes", Bytes{1});
+    const BoundParameters parameters = boundTo(texts);
+    events_.events = {beginningOf("Fake")};
+    analyseResult(diagnostic_.diagnostic, parameters, result, level, events_);
+    return recordOfEvents();
+  }
+};
+
+TEST_F(AnalyseResultTest, RunsOnlyTheAnalysisOnWhatIsGiven) {
+  const DiagnosticRecord record = analyse({"minimum=90"});
+  EXPECT_EQ(record.verdict, Verdict::kPass);
+  EXPECT_EQ(phonesMade_, 0);
+  EXPECT_EQ(namesOf(events_.events),
+            "diagnosticBegan measured collected stageBegan stageEnded found diagnosticCompleted");
+  EXPECT_EQ(record.durations.run, std::nullopt);
+  EXPECT_EQ(record.durations.analysis, 0ns);
+  EXPECT_EQ(analyse({"minimum=91"}).verdict, Verdict::kFail);
+}
+
+TEST_F(AnalyseResultTest, TellsTheResultSoThatItCanBeAnalysedAgain) {
+  const DiagnosticRecord record = analyse({});
+  EXPECT_EQ(*record.measurements.find("Count"), Measurement(90, QZDimensionlessUnit::frames()));
+  EXPECT_EQ(*record.auxiliaryData.find("bytes"), Value(Bytes{1}));
+}
+
+TEST_F(AnalyseResultTest, EndsInTheAnalysisError) {
+  const DiagnosticRecord record =
+      analyse({"analysis.behaviour=" + std::to_string(static_cast<int>(Behaviour::kAnalyzingFails))});
+  EXPECT_EQ(textOf(record.error), "FakeDomain 6 analyzing failed");
+  EXPECT_EQ(record.errorStage, Stage::kAnalyse);
+}
+
+TEST_F(AnalyseResultTest, TellsTheLogLinesOfTheAnalysis) {
+  diagnostic_.diagnostic.makeAnalysis = [] {
+    logDebug("making");
+    return std::make_shared<fake::FakeAnalysis>();
+  };
+  EXPECT_EQ(analyse({}, LogLevel::kDebug).log.size(), 1U);
+  EXPECT_EQ(analyse({}, LogLevel::kDefault).log.size(), 0U);
+  EXPECT_FALSE(LogChannel::isEnabled(LogLevel::kError));
 }
 
 }  // namespace

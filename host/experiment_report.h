@@ -2,7 +2,7 @@
 #pragma once
 
 #include "frame/value.h"
-#include "host/diagnostic_run.h"
+#include "host/diagnostic_record.h"
 
 #include <ostream>
 #include <vector>

@@ -21,6 +21,12 @@ enum class HostErrorCode : std::int64_t {
   kNothingMade = 3,      // a factory returned null
   kNothingMeasured = 4,  // the analysis succeeded without one measured result
   kCannotBeJudged = 5,   // a measured result and its limit do not allow a judgement
+  kCrashed = 6,          // a signal ended the plug-in's process
+  kExited = 7,           // the plug-in ended its process itself
+  kDeadline = 8,         // a stage took longer than its deadline
+  kConnectionLost = 9,   // the plug-in's process closed or overwrote its connection to quazor
+  kNotRecorded = 10,     // the record of the run could not be written
+  kInterrupted = 11,     // the user interrupted the run
 };
 
 DiagnosticErrorPtr hostError(HostErrorCode code, std::string message);

@@ -1,5 +1,6 @@
 #include "host/installation.h"
 
+#include <algorithm>
 #include <system_error>
 
 namespace quazor {
@@ -28,15 +29,42 @@ std::filesystem::path Installation::defaultPlugin() const {
   return !isThere(installed) && isThere(beside) ? beside : installed;
 }
 
+std::vector<std::filesystem::path> Installation::allPlugins() const {
+  std::vector<std::filesystem::path> plugins;
+  std::error_code ignored;
+  for (const auto& entry : std::filesystem::directory_iterator(defaultPlugin().parent_path(), ignored)) {
+    if (entry.path().extension() == ".so" && !entry.path().filename().string().starts_with("lib")) {
+      plugins.push_back(entry.path());
+    }
+  }
+  std::sort(plugins.begin(), plugins.end());
+  return plugins;
+}
+
 std::filesystem::path Installation::defaultProfile() const { return data_ / "profiles" / "default.json"; }
 
 std::filesystem::path Installation::defaultScenario() const { return data_ / "scenarios" / "healthy.json"; }
+
+std::filesystem::path Installation::explanations() const { return data_ / "explanations"; }
 
 std::filesystem::path Installation::scenario(const std::filesystem::path& name) const {
   if (isThere(name) || name.is_absolute()) return name;
   std::filesystem::path installed = data_ / "scenarios" / name;
   installed += ".json";
   return isThere(installed) ? installed : name;
+}
+
+std::vector<std::string> Installation::scenarioNames() const {
+  const std::filesystem::path directory = data_ / "scenarios";
+  std::vector<std::string> names;
+  std::error_code ignored;
+  for (const auto& entry : std::filesystem::recursive_directory_iterator(directory, ignored)) {
+    std::filesystem::path name = std::filesystem::relative(entry.path(), directory, ignored);
+    if (name.extension() != ".json" || name.stem().extension() == ".schema") continue;
+    names.push_back(name.replace_extension().string());
+  }
+  std::sort(names.begin(), names.end());
+  return names;
 }
 
 }  // namespace quazor

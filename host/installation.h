@@ -2,6 +2,8 @@
 #pragma once
 
 #include <filesystem>
+#include <string>
+#include <vector>
 
 namespace quazor {
 
@@ -15,11 +17,16 @@ class Installation {
 
   // The plug-in that is loaded when none is named: the installed one or, where there is none, that beside the program.
   std::filesystem::path defaultPlugin() const;
+  // All plug-ins in the place of the one above, by name.
+  std::vector<std::filesystem::path> allPlugins() const;
   std::filesystem::path defaultProfile() const;
   std::filesystem::path defaultScenario() const;
+  std::filesystem::path explanations() const;  // the directory of the explanations
   // The file that `--phone` means by `name`: a file of that path if there is one, else the installed scenario of that
   // name ("camera_sync/start_refused") if there is one, else the path as it stands.
   std::filesystem::path scenario(const std::filesystem::path& name) const;
+  // All installed scenarios, by the names that scenario() knows, in their order.
+  std::vector<std::string> scenarioNames() const;
 
  private:
   std::filesystem::path programDirectory_;

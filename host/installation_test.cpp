@@ -19,6 +19,7 @@ TEST_F(InstallationTest, FindsItsFilesFromThePlaceOfTheProgram) {
   EXPECT_EQ(installation().defaultPlugin(), prefix_ / QUAZOR_PLUGIN_DIRECTORY / "camera_sensor_diagnostics.so");
   EXPECT_EQ(installation().defaultProfile(), prefix_ / QUAZOR_DATA_DIRECTORY / "profiles/default.json");
   EXPECT_EQ(installation().defaultScenario(), prefix_ / QUAZOR_DATA_DIRECTORY / "scenarios/healthy.json");
+  EXPECT_EQ(installation().explanations(), prefix_ / QUAZOR_DATA_DIRECTORY / "explanations");
 }
 
 TEST_F(InstallationTest, TakesThePluginBesideTheProgramWhereNoneIsInstalled) {

@@ -44,11 +44,9 @@ Json resultsJson(const std::vector<JudgedResult>& results) {
 }
 
 Json measurementsJson(const OrderedMap<Measurement>& measurements) {
-  Json json = Json::object();
-  for (const auto& [name, measurement] : measurements) {
-    json.emplace(name, Json{{"value", numberJson(measurement.value())}, {"unit", measurement.unit().symbol()}});
-  }
-  return json;
+  return objectJson(measurements, [](const Measurement& measurement) {
+    return Json{{"value", numberJson(measurement.value())}, {"unit", measurement.unit().symbol()}};
+  });
 }
 
 Json parametersJson(const BoundParameters& parameters) {

@@ -2,7 +2,7 @@
 #pragma once
 
 #include "host/catalogue.h"
-#include "host/diagnostic_run.h"
+#include "host/diagnostic_record.h"
 #include "host/parameters.h"
 
 #include <nlohmann/json.hpp>

@@ -58,6 +58,20 @@ std::string replaceFile(const std::filesystem::path& file, std::string_view text
 
 }  // namespace
 
+std::string problemOfOutputFile(const std::filesystem::path& file) {
+  struct stat status {};
+  const bool exists = ::stat(file.c_str(), &status) == 0;
+  if (exists && S_ISDIR(status.st_mode)) return "it is a directory";
+  if (exists && !S_ISREG(status.st_mode)) return ::access(file.c_str(), W_OK) == 0 ? "" : errorNumberText();
+  std::error_code error;
+  std::filesystem::path directory = std::filesystem::weakly_canonical(file, error).parent_path();
+  if (error) return error.message();
+  if (directory.empty()) directory = ".";
+  if (::stat(directory.c_str(), &status) != 0) return errorNumberText();
+  if (!S_ISDIR(status.st_mode)) return std::strerror(ENOTDIR);
+  return ::access(directory.c_str(), W_OK | X_OK) == 0 ? "" : errorNumberText();
+}
+
 std::string writeOutputFile(const std::filesystem::path& file, std::string_view text) {
   struct stat status {};
   const bool exists = ::stat(file.c_str(), &status) == 0;

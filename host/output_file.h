@@ -15,4 +15,7 @@ namespace quazor {
 // The empty text on success, else why it failed, for people.
 std::string writeOutputFile(const std::filesystem::path& file, std::string_view text);
 
+// Why `file` could not be written, as far as that shows without writing; the empty text when nothing speaks against it.
+std::string problemOfOutputFile(const std::filesystem::path& file);
+
 }  // namespace quazor

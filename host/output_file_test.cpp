@@ -84,5 +84,21 @@ TEST_F(OutputFileTest, TellsWhyItFailed) {
   EXPECT_EQ(writeOutputFile(directory_.write("file", "") / "out", "text"), "Not a directory");
 }
 
+TEST_F(OutputFileTest, SaysBeforehandWhatSpeaksAgainstAFile) {
+  EXPECT_EQ(problemOfOutputFile(directory_.path() / "out"), "");
+  EXPECT_EQ(problemOfOutputFile(directory_.write("file", "old")), "");
+  EXPECT_EQ(problemOfOutputFile("relative"), "");
+  EXPECT_EQ(problemOfOutputFile("/dev/null"), "");
+  EXPECT_EQ(problemOfOutputFile(directory_.path()), "it is a directory");
+  EXPECT_EQ(problemOfOutputFile(directory_.path() / "nowhere" / "out"), "No such file or directory");
+  EXPECT_EQ(problemOfOutputFile(directory_.path() / "file" / "out"), "Not a directory");
+  fs::create_symlink("file", directory_.path() / "link");
+  EXPECT_EQ(problemOfOutputFile(directory_.path() / "link"), "");
+  fs::create_symlink("itself", directory_.path() / "itself");
+  EXPECT_EQ(problemOfOutputFile(directory_.path() / "itself" / "out"), "Too many levels of symbolic links");
+  EXPECT_EQ(directory_.read("file"), "old");
+  EXPECT_EQ(entriesIn(directory_.path()), 3U);
+}
+
 }  // namespace
 }  // namespace quazor

@@ -6,10 +6,22 @@
 #include "host/parameter_number.h"
 
 #include <algorithm>
+#include <cstdlib>
+#include <sstream>
 
 namespace quazor {
 
 namespace {
+
+// How a setting is called in messages: where it stands, and its text.
+std::string quoted(SettingPlace place, const std::string& text) {
+  const std::string where = place == SettingPlace::kEnvironment ? kSettingsVariable : "--set";
+  return where + " '" + text + "'";
+}
+
+std::string_view sourceOf(SettingPlace place) {
+  return place == SettingPlace::kEnvironment ? "environment" : "command line";
+}
 
 constexpr Half kHalves[] = {Half::kExperiment, Half::kAnalysis};
 
@@ -97,20 +109,23 @@ const Value* findIn(const Profile& profile, const Diagnostic& diagnostic, Half h
                                    : profile.find(diagnostic.name, half, parameter);
 }
 
-std::vector<BoundParameter> bindHalf(const DescribedDiagnostic& diagnostic, Half half, const Profile* profile,
-                                     const std::vector<Setting>& settings) {
+std::vector<BoundParameter> bindHalf(const DescribedDiagnostic& diagnostic, Half half,
+                                     const std::vector<Profile>& profiles, const std::vector<Setting>& settings) {
   std::vector<BoundParameter> bound;
   for (const auto& [name, declaration] : declared(diagnostic, half)) {
     BoundParameter parameter{name, declaration, std::nullopt, {}};
-    const Value* value = profile == nullptr ? nullptr : findIn(*profile, diagnostic.diagnostic, half, name);
-    if (value != nullptr) {
+    for (const Profile& profile : profiles) {
+      const Value* const value = findIn(profile, diagnostic.diagnostic, half, name);
+      if (value == nullptr) continue;
       parameter.value = *value;
-      parameter.source = "profile " + profile->file.filename().string();
+      parameter.source = "profile " + profile.file.filename().string();
     }
-    for (const Setting& setting : settings) {
-      if (!sets(setting, half, name)) continue;
-      parameter.value = setting.value;
-      parameter.source = "command line";
+    for (const SettingPlace place : {SettingPlace::kEnvironment, SettingPlace::kCommandLine}) {
+      for (const Setting& setting : settings) {
+        if (setting.place != place || !sets(setting, half, name)) continue;
+        parameter.value = setting.value;
+        parameter.source = sourceOf(place);
+      }
     }
     bound.push_back(std::move(parameter));
   }
@@ -119,13 +134,13 @@ std::vector<BoundParameter> bindHalf(const DescribedDiagnostic& diagnostic, Half
 
 }  // namespace
 
-Setting parseSetting(const std::string& text) {
-  const std::string what = "--set '" + text + "': ";
+Setting parseSetting(const std::string& text, SettingPlace place) {
+  const std::string what = quoted(place, text) + ": ";
   const std::size_t equals = text.find('=');
   if (equals == std::string::npos) {
     throw Refusal(ExitCode::kUsage, what + "it must have the form [experiment.|analysis.]NAME=VALUE");
   }
-  Setting setting{text, std::nullopt, text.substr(0, equals), 0};
+  Setting setting{text, std::nullopt, text.substr(0, equals), 0, place};
   for (const Half half : kHalves) {
     const std::string prefix = std::string(nameOf(half)) + ".";
     if (setting.half || !setting.name.starts_with(prefix)) continue;
@@ -138,6 +153,14 @@ Setting parseSetting(const std::string& text) {
   if (!value) throw Refusal(ExitCode::kUsage, what + problem);
   setting.value = *value;
   return setting;
+}
+
+std::vector<Setting> settingsOfEnvironment() {
+  std::vector<Setting> settings;
+  const char* const variable = std::getenv(kSettingsVariable);
+  std::istringstream texts(variable == nullptr ? "" : variable);
+  for (std::string text; texts >> text;) settings.push_back(parseSetting(text, SettingPlace::kEnvironment));
+  return settings;
 }
 
 Dictionary dictionaryOf(const std::vector<BoundParameter>& parameters) {
@@ -161,23 +184,25 @@ void checkSettings(const std::vector<Setting>& settings, const std::vector<Descr
       const std::string noun = nounOf(selected);
       const std::string where =
           setting.half ? "no " + std::string(nameOf(*setting.half)) + " of the " + noun : "none of the " + noun;
-      throw Refusal(ExitCode::kUsage, "--set '" + setting.text + "': " + where + " takes a parameter '" + setting.name +
-                                          "'" + didYouMean(setting.name, names) + noteOfUndescribed(selected));
+      throw Refusal(ExitCode::kUsage, quoted(setting.place, setting.text) + ": " + where + " takes a parameter '" +
+                                          setting.name + "'" + didYouMean(setting.name, names) +
+                                          noteOfUndescribed(selected));
     }
     for (std::size_t j = 0; j < i; ++j) {
       const Setting& other = settings[j];
-      const bool overlap = other.name == setting.name && (!other.half || !setting.half || *other.half == *setting.half);
+      const bool overlap = other.place == setting.place && other.name == setting.name &&
+                           (!other.half || !setting.half || *other.half == *setting.half);
       if (!overlap) continue;
-      throw Refusal(ExitCode::kUsage,
-                    "--set '" + other.text + "' and --set '" + setting.text + "' set the same parameter twice");
+      throw Refusal(ExitCode::kUsage, quoted(other.place, other.text) + " and " + quoted(setting.place, setting.text) +
+                                          " set the same parameter twice");
     }
   }
 }
 
-BoundParameters bindParameters(const DescribedDiagnostic& diagnostic, const Profile* profile,
+BoundParameters bindParameters(const DescribedDiagnostic& diagnostic, const std::vector<Profile>& profiles,
                                const std::vector<Setting>& settings) {
-  return {bindHalf(diagnostic, Half::kExperiment, profile, settings),
-          bindHalf(diagnostic, Half::kAnalysis, profile, settings)};
+  return {bindHalf(diagnostic, Half::kExperiment, profiles, settings),
+          bindHalf(diagnostic, Half::kAnalysis, profiles, settings)};
 }
 
 void requireParameters(const DescribedDiagnostic& diagnostic, const BoundParameters& parameters) {

@@ -13,16 +13,26 @@
 
 namespace quazor {
 
-// What one --set says: [experiment.|analysis.]NAME=VALUE.
+// Where a setting stands.
+enum class SettingPlace { kEnvironment, kCommandLine };
+
+// The variable of the environment with settings, separated by white space.
+inline constexpr const char* kSettingsVariable = "QUAZOR_SET";
+
+// What one setting says: [experiment.|analysis.]NAME=VALUE.
 struct Setting {
   std::string text;          // as it was written
   std::optional<Half> half;  // nothing: wherever the parameter is declared
   std::string name;
   Value value;
+  SettingPlace place = SettingPlace::kCommandLine;
 };
 
 // Throws a Refusal (kUsage) for a text that is not of that form or whose value is no finite number.
-Setting parseSetting(const std::string& text);
+Setting parseSetting(const std::string& text, SettingPlace place = SettingPlace::kCommandLine);
+
+// The settings of the environment. Throws as parseSetting.
+std::vector<Setting> settingsOfEnvironment();
 
 // A declared parameter and its value for a run.
 struct BoundParameter {
@@ -58,11 +68,12 @@ struct DescribedDiagnostic {
 void checkProfile(const Profile& profile, const std::vector<DescribedDiagnostic>& catalogue, bool allMustExist);
 
 // Throws a Refusal (kUsage) for a setting whose parameter none of the selected declares, and for two settings of one
-// parameter.
+// parameter in one place.
 void checkSettings(const std::vector<Setting>& settings, const std::vector<DescribedDiagnostic>& selected);
 
-// The parameters of one diagnostic or experiment: a setting's value wins over the profile's. `profile` may be null.
-BoundParameters bindParameters(const DescribedDiagnostic& diagnostic, const Profile* profile,
+// The parameters of one diagnostic or experiment. The last that has a value for a parameter wins: the profiles in their
+// order, then the environment's settings, then the command line's.
+BoundParameters bindParameters(const DescribedDiagnostic& diagnostic, const std::vector<Profile>& profiles,
                                const std::vector<Setting>& settings);
 
 // Throws a Refusal (kUsage) when a required parameter has no value.

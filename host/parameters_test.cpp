@@ -6,6 +6,7 @@
 #include <gmock/gmock.h>
 #include <gtest/gtest.h>
 
+#include <cstdlib>
 #include <functional>
 
 namespace quazor {
@@ -194,7 +195,7 @@ TEST(CheckProfile, RefusesAnEntryThatFitsNoDiagnosticOnlyWhenAllMustExist) {
 
 TEST(BindParameters, LetsASettingWinOverTheProfile) {
   const Profile profile = profileWith(R"({"Fault": {"experiment": {"frameCount": 90, "timeout": 10}}})");
-  const BoundParameters bound = bindParameters(fault(), &profile, settings({"experiment.frameCount=5"}));
+  const BoundParameters bound = bindParameters(fault(), {profile}, settings({"experiment.frameCount=5"}));
   ASSERT_EQ(bound.experiment.size(), 2U);
   EXPECT_EQ(bound.experiment[0].name, "frameCount");
   EXPECT_EQ(bound.experiment[0].value, Value(5));
@@ -206,15 +207,93 @@ TEST(BindParameters, LetsASettingWinOverTheProfile) {
   EXPECT_EQ(bound.analysis[0].source, "");
 }
 
+TEST(BindParameters, TakesTheValueOfTheLastPlaceThatHasOne) {
+  const std::vector<Profile> profiles = {
+      parseProfile("default.json", R"({"schema": 1, "diagnostics": {"Fault": {"experiment":
+        {"frameCount": 1, "timeout": 1}, "analysis": {"frameCount": 1}}}})"),
+      parseProfile("mine.json", R"({"schema": 1, "diagnostics": {"*": {"experiment": {"frameCount": 2}}}})"),
+      parseProfile("yours.json", R"({"schema": 1, "diagnostics": {"Fault": {"experiment": {"frameCount": 3}}}})")};
+  const Setting environment = parseSetting("experiment.frameCount=4", SettingPlace::kEnvironment);
+  const Setting commandLine = parseSetting("experiment.frameCount=5");
+  struct Row {
+    std::vector<Profile> profiles;
+    std::vector<Setting> settings;
+    std::optional<Value> value;
+    const char* source;
+  };
+  const Row rows[] = {
+      {{}, {}, std::nullopt, ""},
+      {{profiles[0]}, {}, 1, "profile default.json"},
+      {{profiles[0], profiles[1]}, {}, 2, "profile mine.json"},
+      {{profiles[0], profiles[1], profiles[2]}, {}, 3, "profile yours.json"},
+      {{profiles[2], profiles[1]}, {}, 2, "profile mine.json"},
+      {profiles, {environment}, 4, "environment"},
+      {profiles, {environment, commandLine}, 5, "command line"},
+      {profiles, {commandLine, environment}, 5, "command line"},
+      {{}, {environment}, 4, "environment"},
+      {profiles, {commandLine}, 5, "command line"},
+  };
+  for (const Row& row : rows) {
+    const BoundParameters bound = bindParameters(fault(), row.profiles, row.settings);
+    EXPECT_EQ(bound.experiment[0].value, row.value) << row.source;
+    EXPECT_EQ(bound.experiment[0].source, row.source);
+  }
+  // What the later places do not hold is the earlier ones'.
+  const BoundParameters bound = bindParameters(fault(), profiles, {environment, commandLine});
+  EXPECT_EQ(bound.experiment[1].value, Value(1));
+  EXPECT_EQ(bound.experiment[1].source, "profile default.json");
+  EXPECT_EQ(bound.analysis[0].value, Value(1));
+}
+
+class SettingsOfEnvironment : public testing::Test {
+ protected:
+  ~SettingsOfEnvironment() override { ::unsetenv(kSettingsVariable); }
+
+  static void set(const char* text) { ASSERT_EQ(::setenv(kSettingsVariable, text, 1), 0); }
+};
+
+TEST_F(SettingsOfEnvironment, AreSeparatedByWhiteSpace) {
+  ::unsetenv(kSettingsVariable);
+  EXPECT_TRUE(settingsOfEnvironment().empty());
+  set(" \t ");
+  EXPECT_TRUE(settingsOfEnvironment().empty());
+  set("duration=3  analysis.frameCount=4\ttimeout=5\n");
+  const std::vector<Setting> settings = settingsOfEnvironment();
+  ASSERT_EQ(settings.size(), 3U);
+  EXPECT_EQ(settings[0].name, "duration");
+  EXPECT_EQ(settings[1].half, Half::kAnalysis);
+  EXPECT_EQ(settings[2].value, Value(5));
+  for (const Setting& setting : settings) EXPECT_EQ(setting.place, SettingPlace::kEnvironment);
+}
+
+TEST_F(SettingsOfEnvironment, AreCalledByTheirVariable) {
+  set("duration");
+  EXPECT_THAT(refusalOf(ExitCode::kUsage, [] { settingsOfEnvironment(); }),
+              HasSubstr("QUAZOR_SET 'duration': it must have the form"));
+  set("duratoin=3");
+  EXPECT_EQ(refusalOf(ExitCode::kUsage, [] { checkSettings(settingsOfEnvironment(), {sync()}); }),
+            "QUAZOR_SET 'duratoin=3': none of the diagnostics takes a parameter 'duratoin'; did you mean 'duration'?");
+  set("duration=3 duration=4");
+  EXPECT_EQ(refusalOf(ExitCode::kUsage, [] { checkSettings(settingsOfEnvironment(), {sync()}); }),
+            "QUAZOR_SET 'duration=3' and QUAZOR_SET 'duration=4' set the same parameter twice");
+}
+
+TEST_F(SettingsOfEnvironment, MaySetWhatTheCommandLineSetsToo) {
+  set("duration=3");
+  std::vector<Setting> both = settingsOfEnvironment();
+  both.push_back(parseSetting("duration=4"));
+  EXPECT_EQ(refusalOf(ExitCode::kUsage, [&] { checkSettings(both, {sync()}); }), "accepted");
+}
+
 TEST(BindParameters, SetsAParameterWithoutPrefixWhereverItIsDeclared) {
-  const BoundParameters bound = bindParameters(fault(), nullptr, settings({"frameCount=7"}));
+  const BoundParameters bound = bindParameters(fault(), {}, settings({"frameCount=7"}));
   EXPECT_EQ(bound.experiment[0].value, Value(7));
   EXPECT_EQ(bound.analysis[0].value, Value(7));
   EXPECT_EQ(bound.experiment[1].value, std::nullopt);
 }
 
 TEST(BindParameters, SetsAParameterWithAPrefixOnlyThere) {
-  const BoundParameters bound = bindParameters(fault(), nullptr, settings({"analysis.frameCount=7"}));
+  const BoundParameters bound = bindParameters(fault(), {}, settings({"analysis.frameCount=7"}));
   EXPECT_EQ(bound.experiment[0].value, std::nullopt);
   EXPECT_EQ(bound.analysis[0].value, Value(7));
 }
@@ -223,20 +302,20 @@ TEST(BindParameters, GivesAnExperimentItsOwnValuesAndElseThoseOfItsDiagnostics) 
   const Profile profile = parseProfile("some.json", R"({"schema": 1,
     "diagnostics": {"Sync.*": {"experiment": {"images": 1, "timeout": 2}}, "Fault": {"experiment": {"timeout": 3}}},
     "experiments": {"Images": {"images": 4}}})");
-  BoundParameters bound = bindParameters(imagesAlone(), &profile, {});
+  BoundParameters bound = bindParameters(imagesAlone(), {profile}, {});
   ASSERT_EQ(bound.experiment.size(), 2U);
   EXPECT_EQ(bound.experiment[0].value, Value(4));
   EXPECT_EQ(bound.experiment[0].source, "profile some.json");
   EXPECT_EQ(bound.experiment[1].value, Value(3));
   EXPECT_TRUE(bound.analysis.empty());
-  bound = bindParameters(imagesAlone(), &profile, settings({"experiment.images=9"}));
+  bound = bindParameters(imagesAlone(), {profile}, settings({"experiment.images=9"}));
   EXPECT_EQ(bound.experiment[0].value, Value(9));
 }
 
 TEST(RequireParameters, RefusesARequiredParameterWithoutAValue) {
   const auto require = [](const DescribedDiagnostic& diagnostic, const std::vector<std::string>& texts) {
     return refusalOf(ExitCode::kUsage,
-                     [&] { requireParameters(diagnostic, bindParameters(diagnostic, nullptr, settings(texts))); });
+                     [&] { requireParameters(diagnostic, bindParameters(diagnostic, {}, settings(texts))); });
   };
   EXPECT_EQ(require(sync(), {}),
             "Sync.Back needs the parameter experiment.duration; give it with "
@@ -249,7 +328,7 @@ TEST(RequireParameters, RefusesARequiredParameterWithoutAValue) {
 }
 
 TEST(DictionaryOf, HoldsOnlyWhatIsSet) {
-  const BoundParameters bound = bindParameters(fault(), nullptr, settings({"timeout=2"}));
+  const BoundParameters bound = bindParameters(fault(), {}, settings({"timeout=2"}));
   EXPECT_EQ(dictionaryOf(bound.experiment), (Dictionary{{"timeout", 2}}));
   EXPECT_TRUE(dictionaryOf(bound.analysis).empty());
 }

@@ -6,6 +6,7 @@
 
 #include <optional>
 #include <string>
+#include <string_view>
 #include <utility>
 
 namespace quazor {
@@ -30,15 +31,53 @@ class PhoneOfScenario final : public Phone {
   SimulatedPhone phone_;
 };
 
-}  // namespace
-
-PhoneMaker phonesOfScenario(const std::filesystem::path& file, bool realTime, std::uint64_t seed) {
+Scenario read(const std::filesystem::path& file) {
   std::string problem;
   std::optional<Scenario> scenario = readScenario(file, &problem);
   if (!scenario) throw Refusal(ExitCode::kCannotRead, "the phone cannot be made: " + problem);
+  return *std::move(scenario);
+}
+
+std::string_view nameOf(Expectation::Verdict verdict) {
+  switch (verdict) {
+    case Expectation::Verdict::kPass: return "pass";
+    case Expectation::Verdict::kFail: return "fail";
+    case Expectation::Verdict::kError: break;
+  }
+  return "error";
+}
+
+std::optional<ExpectedError> expected(const std::optional<FaultError>& error) {
+  if (!error) return std::nullopt;
+  return ExpectedError{error->domain, error->code, error->message};
+}
+
+}  // namespace
+
+PhoneMaker phonesOfScenario(const std::filesystem::path& file, bool realTime, std::uint64_t seed) {
   const PhoneTime time = realTime ? PhoneTime::kReal : PhoneTime::kVirtual;
-  return
-      [scenario = *std::move(scenario), time, seed] { return std::make_unique<PhoneOfScenario>(scenario, time, seed); };
+  return [scenario = read(file), time, seed] { return std::make_unique<PhoneOfScenario>(scenario, time, seed); };
+}
+
+ScenarioSummary summaryOfScenario(const std::filesystem::path& file) {
+  const Scenario scenario = read(file);
+  ScenarioSummary summary{scenario.title, {}, !scenario.faults.empty()};
+  for (const auto& [name, one] : scenario.expectations) {
+    ExpectedOutcome outcome{one.experiment ? one.experiment->name : name,
+                            one.experiment.has_value(),
+                            {},
+                            std::string(nameOf(one.verdict)),
+                            expected(one.error),
+                            expected(one.underlying),
+                            one.failedResults,
+                            std::nullopt};
+    if (one.experiment) {
+      outcome.parameters = one.experiment->parameters;
+      outcome.images = one.experiment->images;
+    }
+    summary.expected.push_back(std::move(outcome));
+  }
+  return summary;
 }
 
 }  // namespace quazor

@@ -1,6 +1,7 @@
 // Phones to run diagnostics on. phone.cpp is the only place that names the backend that stands behind them.
 #pragma once
 
+#include "frame/ordered_map.h"
 #include "platform/platform.h"
 
 #include <nlohmann/json.hpp>
@@ -9,6 +10,8 @@
 #include <filesystem>
 #include <functional>
 #include <memory>
+#include <optional>
+#include <string>
 #include <vector>
 
 namespace quazor {
@@ -40,5 +43,33 @@ using PhoneMaker = std::function<std::unique_ptr<Phone>()>;
 // `realTime`. One seed is one course of events in virtual time. Makes no phone itself. Throws a Refusal (kCannotRead)
 // with the reader's sentence when the file cannot be read.
 PhoneMaker phonesOfScenario(const std::filesystem::path& file, bool realTime, std::uint64_t seed);
+
+// The parts of an error that an outcome is expected to have.
+struct ExpectedError {
+  std::string domain;
+  std::int64_t code = 0;
+  std::string message;
+};
+
+// What a run on a phone is expected to end in.
+struct ExpectedOutcome {
+  std::string name;             // of the diagnostic, or of the experiment that is run alone
+  bool experimentOnly = false;  // then `parameters` are all that it is set up with
+  OrderedMap<double> parameters;
+  std::string verdict;                      // by its name
+  std::optional<ExpectedError> error;       // nothing: none, but for the host's own words
+  std::optional<ExpectedError> underlying;  // nothing: not looked at
+  std::vector<std::string> failedResults;
+  std::optional<std::uint64_t> images;  // how many the auxiliary data holds; nothing: not looked at
+};
+
+struct ScenarioSummary {
+  std::string title;
+  std::vector<ExpectedOutcome> expected;
+  bool hasFaults = false;
+};
+
+// What a scenario file says of itself. Throws a Refusal (kCannotRead) when the file cannot be read.
+ScenarioSummary summaryOfScenario(const std::filesystem::path& file);
 
 }  // namespace quazor

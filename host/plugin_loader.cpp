@@ -87,12 +87,14 @@ void checkDiagnostics(const std::vector<LoadedPlugin>& plugins) {
 
 }  // namespace
 
-void loadPlugins(const std::vector<std::filesystem::path>& files) {
+void loadPlugins(const std::vector<std::filesystem::path>& files,
+                 const std::function<void(const std::filesystem::path& file)>& isNext) {
   std::vector<LoadedPlugin> loaded;
   for (const std::filesystem::path& file : files) {
     const bool again = std::any_of(loaded.begin(), loaded.end(),
                                    [&file](const LoadedPlugin& other) { return isSameFile(other.file, file); });
     if (again) continue;
+    if (isNext) isNext(file);
     loadPlugin(file);
     loaded.push_back({file, QZLab::defaultLab().registrations().size()});
   }

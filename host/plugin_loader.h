@@ -4,6 +4,7 @@
 #include "frame/lab.h"
 
 #include <filesystem>
+#include <functional>
 #include <optional>
 #include <string_view>
 #include <vector>
@@ -15,8 +16,10 @@ namespace quazor {
 //
 // Throws a Refusal (kCannotRead) when a file cannot be loaded, was built against another version of the contract,
 // registers nothing or a name that is taken, or when a diagnostic names an experiment or analysis that, after all
-// plug-ins have been loaded, nobody has registered.
-void loadPlugins(const std::vector<std::filesystem::path>& files);
+// plug-ins have been loaded, nobody has registered. `isNext`, unless it is empty, is told of each file before it is
+// loaded.
+void loadPlugins(const std::vector<std::filesystem::path>& files,
+                 const std::function<void(const std::filesystem::path& file)>& isNext = nullptr);
 
 // The contract version of the symbol that a dynamic linker's message complains of; nothing when it is about something
 // else.

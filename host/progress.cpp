@@ -46,59 +46,44 @@ std::string progressText(const std::string& name, double elapsedSeconds, const E
 }
 
 void Progress::start(const std::string& name, const ExpectedProgress& expected) {
-  if (terminal_ == nullptr) return;
-  {
-    const std::lock_guard lock(mutex_);
-    running_ = true;
-  }
-  thread_ = std::thread([this, name, expected] { show(name, expected); });
+  running_ = true;
+  name_ = name;
+  expected_ = expected;
+  begin_ = SteadyClock::now();
+  nextUpdate_ = begin_ + kQuietTime;
 }
 
 void Progress::countFrames(std::function<std::uint64_t()> count) {
-  const std::lock_guard lock(mutex_);
-  if (running_) frames_.swap(count);
+  if (running_) frames_ = std::move(count);
+}
+
+void Progress::update() {
+  if (!running_ || terminal_ == nullptr) return;
+  const SteadyClock::time_point now = SteadyClock::now();
+  if (now < nextUpdate_) return;
+  nextUpdate_ = now + kPeriod;
+  const double elapsed = std::chrono::duration<double>(now - begin_).count();
+  const std::optional<std::uint64_t> frames = frames_ ? std::optional(frames_()) : std::nullopt;
+  erase();
+  *terminal_ << progressText(name_, elapsed, expected_, frames) << std::flush;
+  lineIsThere_ = true;
 }
 
 void Progress::stop() {
-  std::function<std::uint64_t()> frames;  // destroyed after the lock is given back
-  {
-    const std::lock_guard lock(mutex_);
-    running_ = false;
-    frames.swap(frames_);
-    erase();
-  }
-  wake_.notify_all();
-  if (thread_.joinable()) thread_.join();
+  running_ = false;
+  frames_ = nullptr;
+  erase();
 }
 
 void Progress::aside(const std::function<void()>& write) {
-  const std::lock_guard lock(mutex_);
   erase();
   write();
 }
 
-void Progress::show(const std::string& name, const ExpectedProgress& expected) {
-  const SteadyClock::time_point begin = SteadyClock::now();
-  std::unique_lock lock(mutex_);
-  for (std::chrono::milliseconds due = kQuietTime;; due += kPeriod) {
-    if (wake_.wait_until(lock, begin + due, [this] { return !running_; })) return;
-    const double elapsed = std::chrono::duration<double>(SteadyClock::now() - begin).count();
-    const std::optional<std::uint64_t> frames = frames_ ? std::optional(frames_()) : std::nullopt;
-    erase();
-    *terminal_ << progressText(name, elapsed, expected, frames) << std::flush;
-    shown_ = true;
-  }
-}
-
 void Progress::erase() {
-  if (!shown_) return;
+  if (!lineIsThere_) return;
   *terminal_ << "\r\033[K" << std::flush;
-  shown_ = false;
-}
-
-void LogBesideProgress::write(LogLevel level, std::string_view subsystem, std::string_view category,
-                              std::string_view text) {
-  progress_.aside([&] { backend_->write(level, subsystem, category, text); });
+  lineIsThere_ = false;
 }
 
 }  // namespace quazor

@@ -1,19 +1,14 @@
 // The progress line: what is running, for how long, and how many frames have come.
 #pragma once
 
-#include "frame/log_channel.h"
 #include "host/parameters.h"
 
 #include <chrono>
-#include <condition_variable>
 #include <cstdint>
 #include <functional>
-#include <memory>
-#include <mutex>
 #include <optional>
 #include <ostream>
 #include <string>
-#include <thread>
 
 namespace quazor {
 
@@ -29,8 +24,9 @@ ExpectedProgress expectedProgressOf(const BoundParameters& parameters);
 std::string progressText(const std::string& name, double elapsedSeconds, const ExpectedProgress& expected,
                          std::optional<std::uint64_t> frames);
 
-// Keeps one line of a terminal up to date while something runs, from 0.3 seconds after its beginning on, and erases it
-// at the end. Any thread.
+// One line of a terminal about what is running, from 0.3 seconds after its beginning on; erased at the end.
+//
+// Thread: one at a time.
 class Progress {
  public:
   // `terminal` is borrowed; null shows nothing.
@@ -39,40 +35,29 @@ class Progress {
   Progress& operator=(const Progress&) = delete;
   ~Progress() { stop(); }
 
+  bool isShown() const { return terminal_ != nullptr; }
   // REQUIRES: nothing is running.
   void start(const std::string& name, const ExpectedProgress& expected);
-  // Asks `count` for the frames that have come, on a thread of its own, until stop(); it must not use this object.
+  // Where the number of frames that have come is asked for, until stop(). Does nothing when nothing is running.
   void countFrames(std::function<std::uint64_t()> count);
-  // When it returns, the line is erased and stays so. Does nothing when nothing is running.
+  // Brings the line up to date; to be called now and then, as often as one likes.
+  void update();
+  // Erases the line. Does nothing when nothing is running.
   void stop();
   // Erases the line and calls `write`, which may write to the terminal; the line comes back with its next change.
   void aside(const std::function<void()>& write);
 
  private:
-  void show(const std::string& name, const ExpectedProgress& expected);
   void erase();
 
   std::ostream* const terminal_;
-  std::mutex mutex_;  // held while the terminal is written to
-  std::condition_variable wake_;
-  bool running_ = false;                   // guarded by mutex_
-  bool shown_ = false;                     // guarded by mutex_
-  std::function<std::uint64_t()> frames_;  // guarded by mutex_
-  std::thread thread_;                     // touched by start() and stop() only
-};
-
-// Hands log lines on with the progress line out of their way.
-class LogBesideProgress final : public LogBackend {
- public:
-  // `progress` is borrowed.
-  LogBesideProgress(Progress& progress, std::shared_ptr<LogBackend> backend)
-      : progress_(progress), backend_(std::move(backend)) {}
-
-  void write(LogLevel level, std::string_view subsystem, std::string_view category, std::string_view text) override;
-
- private:
-  Progress& progress_;
-  const std::shared_ptr<LogBackend> backend_;
+  bool running_ = false;
+  bool lineIsThere_ = false;
+  std::string name_;
+  ExpectedProgress expected_;
+  std::function<std::uint64_t()> frames_;
+  std::chrono::steady_clock::time_point begin_;
+  std::chrono::steady_clock::time_point nextUpdate_;
 };
 
 }  // namespace quazor

@@ -1,7 +1,5 @@
 #include "host/progress.h"
 
-#include "backends/threads/recording_log.h"
-
 #include <gmock/gmock.h>
 #include <gtest/gtest.h>
 
@@ -105,12 +103,16 @@ TEST(Progress, KeepsTheCounterOfFramesNoLongerThanTheRun) {
   EXPECT_EQ(watched.use_count(), 2);
 }
 
-TEST(LogBesideProgress, HandsLinesOnAsTheyAre) {
+TEST(Progress, ShowsALongRunAndErasesItsLine) {
   std::ostringstream terminal;
   Progress progress(&terminal);
-  const auto log = std::make_shared<RecordingLog>();
-  LogBesideProgress(progress, log).write(LogLevel::kDebug, "s", "c", "text");
-  EXPECT_THAT(log->records(), testing::ElementsAre(LogRecord{LogLevel::kDebug, "s", "c", "text"}));
+  progress.start("Name", {});
+  progress.countFrames([] { return std::uint64_t{7}; });
+  while (terminal.str().empty()) progress.update();
+  EXPECT_EQ(terminal.str(), "Running Name: 0.3 s");
+  progress.aside([&terminal] { terminal << "|"; });
+  progress.stop();
+  EXPECT_EQ(terminal.str(), "Running Name: 0.3 s\r\033[K|");
 }
 
 }  // namespace

@@ -1,5 +1,8 @@
 #include "host/run_log.h"
 
+#include "host/run_event.h"
+#include "host/timestamp.h"
+
 #include <utility>
 
 namespace quazor {
@@ -13,23 +16,18 @@ std::string_view nameOf(LogLevel level) {
   return "debug";
 }
 
-RunLog::RunLog(std::shared_ptr<const Clock> clock, std::vector<Listener> listeners)
-    : clock_(std::move(clock)), begin_(clock_->now()), listeners_(std::move(listeners)) {}
+RunLog::RunLog(std::shared_ptr<const Clock> clock, RunEventSink& events)
+    : clock_(std::move(clock)), begin_(clock_->now()), events_(&events) {}
 
-void RunLog::write(LogLevel level, std::string_view subsystem, std::string_view category, std::string_view text) {
-  LogLine line{clock_->now() - begin_, level, std::string(text)};
-  {
-    const std::lock_guard lock(mutex_);
-    lines_.push_back(std::move(line));
-  }
-  for (const Listener& listener : listeners_) {
-    if (level <= listener.level) listener.backend->write(level, subsystem, category, text);
-  }
+void RunLog::write(LogLevel level, std::string_view /*subsystem*/, std::string_view /*category*/,
+                   std::string_view text) {
+  const std::lock_guard lock(mutex_);
+  if (events_ != nullptr) events_->take(Logged{{clock_->now() - begin_, level, std::string(text), dateNow()}});
 }
 
-std::vector<LogLine> RunLog::lines() const {
+void RunLog::close() {
   const std::lock_guard lock(mutex_);
-  return lines_;
+  events_ = nullptr;
 }
 
 }  // namespace quazor

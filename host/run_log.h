@@ -2,6 +2,7 @@
 #pragma once
 
 #include "frame/log_channel.h"
+#include "frame/value.h"
 #include "platform/clock.h"
 
 #include <chrono>
@@ -9,9 +10,10 @@
 #include <mutex>
 #include <string>
 #include <string_view>
-#include <vector>
 
 namespace quazor {
+
+class RunEventSink;
 
 std::string_view nameOf(LogLevel level);  // "error", "default", "debug"
 
@@ -19,30 +21,25 @@ struct LogLine {
   std::chrono::nanoseconds time{};  // since the run began, by the phone's clock
   LogLevel level = LogLevel::kDefault;
   std::string text;
+  Date date{};  // by the wall clock
 };
 
-// Keeps every line with its time, and hands those of the chosen levels on. Any thread.
+// Tells every line as an event, until it is closed. Any thread.
 class RunLog final : public LogBackend {
  public:
-  // Gets the lines of `level` and of the levels before it.
-  struct Listener {
-    std::shared_ptr<LogBackend> backend;
-    LogLevel level;
-  };
-
-  // The run begins now.
-  RunLog(std::shared_ptr<const Clock> clock, std::vector<Listener> listeners);
+  // The run begins now. `events` is borrowed until close(), and gets one line at a time.
+  RunLog(std::shared_ptr<const Clock> clock, RunEventSink& events);
 
   void write(LogLevel level, std::string_view subsystem, std::string_view category, std::string_view text) override;
 
-  std::vector<LogLine> lines() const;
+  // What is written later is dropped.
+  void close();
 
  private:
   const std::shared_ptr<const Clock> clock_;
   const std::chrono::nanoseconds begin_;
-  const std::vector<Listener> listeners_;
-  mutable std::mutex mutex_;    // nothing else is called while it is held
-  std::vector<LogLine> lines_;  // guarded by mutex_
+  std::mutex mutex_;      // held while the sink takes a line
+  RunEventSink* events_;  // guarded by mutex_; null when closed
 };
 
 }  // namespace quazor

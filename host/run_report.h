@@ -1,13 +1,13 @@
 // RunReport: what a run of diagnostics or experiments prints and writes, as it goes and at its end.
 #pragma once
 
-#include "host/diagnostic_run.h"
+#include "frame/log_channel.h"
 #include "host/exit_code.h"
 #include "host/progress.h"
+#include "host/record_builder.h"
+#include "host/report_format.h"
+#include "host/run_event.h"
 
-#include <filesystem>
-#include <functional>
-#include <mutex>
 #include <optional>
 #include <ostream>
 #include <string>
@@ -24,49 +24,42 @@ struct Console {
   bool blocks = false;         // text may be UTF-8, with block elements in it
 };
 
-enum class Format { kText, kJson, kCsv };
-
 struct ReportOptions {
-  Format format = Format::kText;  // kCsv is for experiments only
-  std::filesystem::path output;   // where the report goes; empty for the console
-  bool ofExperiments = false;     // of experiments on their own
+  Format format = Format::kText;
+  // Where the report in that format goes; empty for the console.
+  std::filesystem::path output;
+  std::vector<OutputRequest> outputs{};  // further reports
+  LogLevel shownLog = LogLevel::kError;  // lines up to this level go to the console's error stream
 };
 
-// The text report goes out record by record, the JSON document or CSV table at the end. With an output file the report
-// goes there at the end, and the console gets one line a diagnostic.
+// The text report goes out diagnostic by diagnostic, every other one at the end. With an output file the report goes
+// there at the end, and the console gets one line a diagnostic.
 //
-// The interrupt may come on any thread at any time; the others calls are the running thread's.
-class RunReport {
+// Thread: one at a time.
+class RunReport final : public RunEventSink {
  public:
   // `console` is borrowed.
   RunReport(ReportOptions options, Console& console);
 
-  // `name` runs from now on.
-  void begin(const std::string& name, const BoundParameters& parameters);
-  // What began is over.
-  void finish(DiagnosticRecord record);
-  // Nothing more will run: writes what stands at the end.
-  ExitCode conclude();
-  // Writes what has been finished and what was interrupted, then calls `leave`, while no other call gets through. Does
-  // nothing after conclude(). When another call does not end in time, such as one that writes to a pipe that nobody
-  // reads, `leave` is called without a word.
-  void interrupt(const std::function<void()>& leave);
+  void take(const RunEvent& event) override;
+
+  // What the run came to, once it has ended: kCannotWrite when not all reports could be written.
+  ExitCode exitCode() const;
 
   Progress& progress() { return progress_; }
 
  private:
-  void print(std::ostream& out, const DiagnosticRecord& record, bool colour) const;
-  void printCounts(std::ostream& out) const;
-  ExitCode writeEnd(const std::optional<std::string>& interrupted);
-  std::string reportText(const std::optional<std::string>& interrupted) const;
+  void finishDiagnostic();
+  void finishRun(const RunEnded& event);
+  void writeFile(const OutputRequest& output, const std::optional<std::string>& interrupted);
 
   const ReportOptions options_;
   Console& console_;
   Progress progress_;
-  std::timed_mutex mutex_;  // guards what follows, and the order of what is written
+  RecordBuilder builder_;
+  RunBegan run_;
   std::vector<DiagnosticRecord> records_;
-  std::optional<std::string> running_;
-  bool concluded_ = false;
+  bool allWritten_ = true;
 };
 
 // The exit code for the verdicts: an error wins over a failure.

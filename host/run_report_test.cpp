@@ -1,6 +1,7 @@
 #include "host/run_report.h"
 
 #include "host/test_directory.h"
+#include "host/test_events.h"
 #include "host/test_records.h"
 
 #include <gmock/gmock.h>
@@ -17,18 +18,60 @@ using testing::HasSubstr;
 using testing::Not;
 using Json = nlohmann::ordered_json;
 
+// The events of a diagnostic whose record is this one.
+std::vector<RunEvent> eventsOf(const DiagnosticRecord& record) {
+  DiagnosticBegan began = beginningOf(record.name);
+  began.experimentOnly = record.experimentOnly;
+  began.parameters = record.parameters;
+  Found found;
+  for (const JudgedResult& one : record.measuredResults) found.results.push_back(one.result);
+  Measured measured;
+  for (const auto& one : record.measurements) measured.measurements.push_back(one);
+  std::vector<RunEvent> events = {began, measured, found};
+  for (const auto& [key, value] : record.auxiliaryData) events.emplace_back(Collected{key, value});
+  for (const LogLine& line : record.log) events.emplace_back(Logged{line});
+  if (record.error != nullptr) events.emplace_back(Failed{Stage::kRun, record.error});
+  events.emplace_back(FaultsCounted{record.faults});
+  events.emplace_back(DiagnosticEnded{record.verdict, momentAt(9)});
+  return events;
+}
+
 class RunReportTest : public testing::Test {
  protected:
+  static void takeAll(RunReport& report, const std::vector<RunEvent>& events) {
+    for (const RunEvent& event : events) report.take(event);
+  }
+
+  // The record of a diagnostic, or of an experiment, of that verdict, without log lines.
+  DiagnosticRecord quietRecord(const std::string& name, Verdict verdict) const {
+    DiagnosticRecord record = recordOf(name, verdict);
+    record.log.clear();
+    record.experimentOnly = ofExperiments_;
+    if (ofExperiments_) {
+      record.measuredResults.clear();
+      record.auxiliaryData.set("samples", Array{0, 1, 2, 3, 4, 5, 6, 7});
+    }
+    return record;
+  }
+
   // Runs diagnostics with these verdicts, named A, B and so on.
-  static void run(RunReport& report, const std::vector<Verdict>& verdicts) {
+  void run(RunReport& report, const std::vector<Verdict>& verdicts) const {
+    RunBegan began = runOf({});
+    began.ofExperiments = ofExperiments_;
+    report.take(began);
     std::string name = "A";
     for (const Verdict verdict : verdicts) {
-      report.begin(name, {});
-      report.finish(recordOf(name, verdict));
+      takeAll(report, eventsOf(quietRecord(name, verdict)));
       ++name[0];
     }
   }
 
+  static ExitCode end(RunReport& report, const std::optional<std::string>& interrupted = std::nullopt) {
+    report.take(RunEnded{interrupted, momentAt(99)});
+    return report.exitCode();
+  }
+
+  bool ofExperiments_ = false;
   TestDirectory directory_;
   std::ostringstream out_;
   std::ostringstream err_;
@@ -44,11 +87,11 @@ TEST_F(RunReportTest, PrintsEachRecordAsItIsFinished) {
 TEST_F(RunReportTest, SummarizesSeveralDiagnosticsButNotOne) {
   RunReport one({}, console_);
   run(one, {Verdict::kPass});
-  EXPECT_EQ(one.conclude(), ExitCode::kAllPassed);
+  EXPECT_EQ(end(one), ExitCode::kAllPassed);
   EXPECT_THAT(out_.str(), Not(HasSubstr("1 diagnostic")));
   RunReport two({}, console_);
   run(two, {Verdict::kPass, Verdict::kFail});
-  EXPECT_EQ(two.conclude(), ExitCode::kFailed);
+  EXPECT_EQ(end(two), ExitCode::kFailed);
   EXPECT_THAT(out_.str(), EndsWith("2 diagnostics: 1 passed, 1 failed, 0 ended in an error\n"));
 }
 
@@ -56,7 +99,7 @@ TEST_F(RunReportTest, PrintsOneJsonDocumentAndNothingElse) {
   RunReport report({Format::kJson, {}}, console_);
   run(report, {Verdict::kPass, Verdict::kError});
   EXPECT_EQ(out_.str(), "");
-  EXPECT_EQ(report.conclude(), ExitCode::kError);
+  EXPECT_EQ(end(report), ExitCode::kError);
   EXPECT_EQ(Json::parse(out_.str())["diagnostics"].size(), 2U);
 }
 
@@ -66,7 +109,7 @@ TEST_F(RunReportTest, WritesTheOutputFileAndPrintsTheVerdicts) {
     RunReport report({format, directory_.path() / "out"}, console_);
     run(report, {Verdict::kPass, Verdict::kFail});
     EXPECT_FALSE(std::filesystem::exists(directory_.path() / "out"));
-    EXPECT_EQ(report.conclude(), ExitCode::kFailed);
+    EXPECT_EQ(end(report), ExitCode::kFailed);
     EXPECT_EQ(out_.str(), "PASS  A\nFAIL  B\n2 diagnostics: 1 passed, 1 failed, 0 ended in an error\n");
     const std::string written = directory_.read("out");
     if (format == Format::kJson) {
@@ -82,7 +125,7 @@ TEST_F(RunReportTest, TellsWhenTheOutputFileCannotBeWrittenAndStillPrintsTheVerd
   const std::filesystem::path file = directory_.path() / "nowhere" / "out";
   RunReport report({Format::kJson, file}, console_);
   run(report, {Verdict::kFail});
-  EXPECT_EQ(report.conclude(), ExitCode::kCannotWrite);
+  EXPECT_EQ(end(report), ExitCode::kCannotWrite);
   EXPECT_EQ(out_.str(), "FAIL  A\n");
   EXPECT_EQ(err_.str(),
             "quazor: the output file '" + file.string() + "' cannot be written: No such file or directory\n");
@@ -92,101 +135,86 @@ TEST_F(RunReportTest, TellsWhenTheStandardOutputCannotBeWritten) {
   RunReport report({}, console_);
   run(report, {Verdict::kPass});
   out_.setstate(std::ios::badbit);
-  EXPECT_EQ(report.conclude(), ExitCode::kCannotWrite);
+  EXPECT_EQ(end(report), ExitCode::kCannotWrite);
   EXPECT_EQ(err_.str(), "quazor: the standard output cannot be written\n");
 }
 
 class ExperimentReportTest : public RunReportTest {
  protected:
-  static void run(RunReport& report, const std::vector<Verdict>& verdicts) {
-    std::string name = "A";
-    for (const Verdict verdict : verdicts) {
-      DiagnosticRecord record = recordOf(name, verdict);
-      record.experimentOnly = true;
-      record.auxiliaryData.set("samples", Array{0, 1, 2, 3, 4, 5, 6, 7});
-      report.begin(name, {});
-      report.finish(std::move(record));
-      ++name[0];
-    }
-  }
+  ExperimentReportTest() { ofExperiments_ = true; }
 };
 
 TEST_F(ExperimentReportTest, PrintsEachExperimentAndHowManyThereWere) {
-  RunReport report({Format::kText, {}, true}, console_);
+  RunReport report({}, console_);
   run(report, {Verdict::kPass, Verdict::kError});
   EXPECT_THAT(out_.str(), testing::AllOf(HasSubstr("  DONE\n"), HasSubstr("  ERROR\n"), HasSubstr("\n  .:::::::\n")));
-  EXPECT_EQ(report.conclude(), ExitCode::kError);
+  EXPECT_EQ(end(report), ExitCode::kError);
   EXPECT_THAT(out_.str(), EndsWith("2 experiments: 1 returned a result, 1 ended in an error\n"));
 }
 
 TEST_F(ExperimentReportTest, DrawsBlocksWhereTheConsoleTakesThem) {
   console_.blocks = true;
-  RunReport report({Format::kText, {}, true}, console_);
+  RunReport report({}, console_);
   run(report, {Verdict::kPass});
-  EXPECT_EQ(report.conclude(), ExitCode::kAllPassed);
+  EXPECT_EQ(end(report), ExitCode::kAllPassed);
   EXPECT_THAT(out_.str(), HasSubstr("\u2588"));
 }
 
 TEST_F(ExperimentReportTest, WritesTheDocumentOfExperiments) {
-  RunReport report({Format::kJson, {}, true}, console_);
+  RunReport report({Format::kJson, {}}, console_);
   run(report, {Verdict::kPass});
-  EXPECT_EQ(report.conclude(), ExitCode::kAllPassed);
+  EXPECT_EQ(end(report), ExitCode::kAllPassed);
   EXPECT_EQ(Json::parse(out_.str())["experiments"].size(), 1U);
 }
 
 TEST_F(ExperimentReportTest, WritesOneTableAndTellsErrorsBesideIt) {
-  RunReport report({Format::kCsv, {}, true}, console_);
+  RunReport report({Format::kCsv, {}}, console_);
   run(report, {Verdict::kPass, Verdict::kError});
   EXPECT_EQ(out_.str(), "");
-  EXPECT_EQ(report.conclude(), ExitCode::kError);
+  EXPECT_EQ(end(report), ExitCode::kError);
   EXPECT_EQ(out_.str(), "experiment,measurement,value,unit\nA,Raw,90,frames\nB,Raw,90,frames\n");
   EXPECT_EQ(err_.str(),
             "quazor: B ended in an error\n  Domain code -1: it failed\n  caused by Deep code 2: the cause\n");
 }
 
 TEST_F(ExperimentReportTest, WritesTheTableToAFile) {
-  RunReport report({Format::kCsv, directory_.path() / "out", true}, console_);
+  RunReport report({Format::kCsv, directory_.path() / "out"}, console_);
   run(report, {Verdict::kPass});
-  EXPECT_EQ(report.conclude(), ExitCode::kAllPassed);
+  EXPECT_EQ(end(report), ExitCode::kAllPassed);
   EXPECT_EQ(directory_.read("out"), "experiment,measurement,value,unit\nA,Raw,90,frames\n");
   EXPECT_EQ(out_.str(), "DONE  A\n");
 }
 
 TEST_F(ExperimentReportTest, SpeaksOfExperimentsWhenInterruptedBetweenTwo) {
-  RunReport report({Format::kCsv, {}, true}, console_);
+  RunReport report({Format::kCsv, {}}, console_);
   run(report, {Verdict::kPass});
-  report.interrupt([] {});
+  end(report, "");
   EXPECT_EQ(err_.str(), "quazor: interrupted between two experiments\n");
   EXPECT_THAT(out_.str(), HasSubstr("A,Raw,90,frames\n"));
 }
 
 TEST_F(RunReportTest, PointsOutUnfiredFaults) {
   RunReport report({}, console_);
-  DiagnosticRecord record = recordOf("A", Verdict::kPass);
+  DiagnosticRecord record = quietRecord("A", Verdict::kPass);
   record.faults[0].fired = 0;
-  report.begin("A", {});
-  report.finish(std::move(record));
+  takeAll(report, eventsOf(record));
   EXPECT_THAT(err_.str(), HasSubstr("A: a fault of the phone never fired"));
 }
 
 TEST_F(RunReportTest, WritesWhatIsFinishedWhenInterrupted) {
   RunReport report({Format::kJson, {}}, console_);
-  run(report, {Verdict::kPass});
-  report.begin("Slow", {});
-  bool left = false;
-  report.interrupt([&left] { left = true; });
-  EXPECT_TRUE(left);
+  run(report, {Verdict::kPass, Verdict::kError});
+  EXPECT_EQ(end(report, "B"), ExitCode::kError);
   const Json document = Json::parse(out_.str());
-  EXPECT_EQ(document["diagnostics"].size(), 1U);
-  EXPECT_EQ(document["interrupted"], "Slow");
-  EXPECT_EQ(err_.str(), "quazor: interrupted while Slow was running\n");
+  EXPECT_EQ(document["diagnostics"].size(), 2U);
+  EXPECT_EQ(document["interrupted"], "B");
+  EXPECT_EQ(err_.str(), "quazor: interrupted while B was running\n");
 }
 
 TEST_F(RunReportTest, WritesTheOutputFileWhenInterrupted) {
   RunReport report({Format::kText, directory_.path() / "out"}, console_);
   run(report, {Verdict::kPass});
-  report.begin("Slow", {});
-  report.interrupt([] {});
+  end(report, "Slow");
   EXPECT_THAT(directory_.read("out"), EndsWith("1 diagnostic: 1 passed, 0 failed, 0 ended in an error\n"
                                                "Interrupted while Slow was running.\n"));
 }
@@ -194,18 +222,61 @@ TEST_F(RunReportTest, WritesTheOutputFileWhenInterrupted) {
 TEST_F(RunReportTest, SaysSoWhenInterruptedBetweenTwoDiagnostics) {
   RunReport report({Format::kJson, {}}, console_);
   run(report, {Verdict::kPass});
-  report.interrupt([] {});
+  end(report, "");
   EXPECT_EQ(Json::parse(out_.str())["interrupted"], "");
   EXPECT_EQ(err_.str(), "quazor: interrupted between two diagnostics\n");
 }
 
-TEST_F(RunReportTest, IgnoresAnInterruptAfterItsEnd) {
-  RunReport report({Format::kJson, {}}, console_);
+TEST_F(RunReportTest, WritesFurtherReportsInTheirFormats) {
+  ReportOptions options;
+  for (const Format format : kFormats) {
+    options.outputs.push_back({format, directory_.path() / std::string(nameOf(format))});
+  }
+  RunReport report(options, console_);
   run(report, {Verdict::kPass});
-  report.conclude();
-  const std::string before = out_.str();
-  report.interrupt([] { FAIL() << "it left"; });
-  EXPECT_EQ(out_.str(), before);
+  EXPECT_FALSE(std::filesystem::exists(directory_.path() / "text"));
+  EXPECT_EQ(end(report), ExitCode::kAllPassed);
+  EXPECT_THAT(out_.str(), HasSubstr("  PASS\n"));
+  EXPECT_EQ(directory_.read("text"), out_.str());
+  EXPECT_EQ(Json::parse(directory_.read("json"))["diagnostics"].size(), 1U);
+  EXPECT_THAT(directory_.read("csv"), testing::StartsWith("diagnostic,verdict,result,"));
+  EXPECT_THAT(directory_.read("junit"), testing::StartsWith("<?xml"));
+  EXPECT_THAT(directory_.read("ocp"), testing::StartsWith("{\"schemaVersion\""));
+}
+
+TEST_F(RunReportTest, WritesTheOtherReportsWhenOneCannotBeWritten) {
+  ReportOptions options;
+  options.outputs = {{Format::kJson, directory_.path() / "nowhere" / "a"}, {Format::kJson, directory_.path() / "b"}};
+  RunReport report(options, console_);
+  run(report, {Verdict::kPass});
+  EXPECT_EQ(end(report), ExitCode::kCannotWrite);
+  EXPECT_TRUE(Json::accept(directory_.read("b")));
+}
+
+TEST_F(RunReportTest, ShowsLogLinesUpToTheirLevelByTheWallClock) {
+  ReportOptions options;
+  options.shownLog = LogLevel::kDefault;
+  RunReport report(options, console_);
+  report.take(beginningOf("A"));
+  report.take(Logged{{{}, LogLevel::kError, "an error", momentAt(250)}});
+  report.take(Logged{{{}, LogLevel::kDefault, "two\nlines", momentAt(1000)}});
+  report.take(Logged{{{}, LogLevel::kDebug, "a detail", momentAt(1001)}});
+  const std::string category(sharedLog().category());
+  EXPECT_EQ(err_.str(), "2026-11-21 01:08:00.250 error " + category + ": an error\n" +
+                            "2026-11-21 01:08:01.000 default " + category + ": two\n    lines\n");
+}
+
+TEST_F(RunReportTest, ShowsTheProgressOfWhatIsRunning) {
+  console_.showsProgress = true;
+  RunReport report({}, console_);
+  EXPECT_TRUE(report.progress().isShown());
+  report.take(beginningOf("Slow"));
+  while (err_.str().empty()) report.progress().update();
+  EXPECT_EQ(err_.str(), "Running Slow: 0.3 s of 3 s");
+  report.take(Logged{{{}, LogLevel::kError, "a line", momentAt(250)}});
+  EXPECT_THAT(err_.str(), testing::StartsWith("Running Slow: 0.3 s of 3 s\r\033[K2026-11-21"));
+  report.take(DiagnosticEnded{Verdict::kPass, momentAt(9)});
+  EXPECT_THAT(err_.str(), EndsWith("a line\n"));
 }
 
 TEST(ExitCodeOf, LetsAnErrorWinOverAFailure) {

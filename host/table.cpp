@@ -7,6 +7,8 @@ namespace quazor {
 
 namespace {
 
+constexpr std::size_t kWidestLine = 80;
+
 std::size_t widthOf(std::string_view text) {
   return static_cast<std::size_t>(std::count_if(
       text.begin(), text.end(), [](char unit) { return (static_cast<unsigned char>(unit) & 0xC0) != 0x80; }));
@@ -18,6 +20,16 @@ bool isControl(unsigned char unit) { return unit < 0x20 || unit == 0x7F; }
 bool isWideControl(std::string_view rest) {
   return rest.size() >= 2 && rest[0] == '\xC2' && static_cast<unsigned char>(rest[1]) < 0xA0 &&
          static_cast<unsigned char>(rest[1]) >= 0x80;
+}
+
+// Up to the next blank outside of back quotes; takes it, and the blanks after it, off the text.
+std::string_view takeWord(std::string_view& text) {
+  bool quoted = false;
+  std::size_t end = 0;
+  for (; end < text.size() && (quoted || text[end] != ' '); ++end) quoted ^= text[end] == '`';
+  const std::string_view word = text.substr(0, end);
+  text.remove_prefix(std::min(text.find_first_not_of(' ', end), text.size()));
+  return word;
 }
 
 }  // namespace
@@ -53,6 +65,25 @@ std::string indentedLines(std::string_view text, std::string_view indent) {
     if (end == std::string_view::npos) return lines;
     text.remove_prefix(end + 1);
   }
+}
+
+std::string wrapped(std::string_view text, std::string_view first, std::string_view rest) {
+  const std::string shown = printable(text);
+  std::string lines;
+  std::string line(first);
+  bool empty = true;  // but for its beginning
+  for (std::string_view left = shown; !left.empty();) {
+    const std::string_view word = takeWord(left);
+    if (!empty && widthOf(line) + 1 + widthOf(word) > kWidestLine) {
+      lines += line + '\n';
+      line = rest;
+      empty = true;
+    }
+    if (!empty) line += ' ';
+    line += word;
+    empty = false;
+  }
+  return lines + line + '\n';
 }
 
 void Table::addRow(std::vector<std::string> cells, std::string before, std::string after) {

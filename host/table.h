@@ -16,6 +16,11 @@ std::string printable(std::string_view text);
 // As printable, but each line of the text begins with `indent` and ends with a new line.
 std::string indentedLines(std::string_view text, std::string_view indent);
 
+// The text, as printable, in lines of at most 80 columns: the first one begins with `first`, the others with `rest`.
+// Lines are broken at blanks, but not inside of `back quotes`: a command stays in one piece. What has no place to break
+// it may be longer.
+std::string wrapped(std::string_view text, std::string_view first, std::string_view rest);
+
 // Cells in aligned columns. Widths count code points.
 class Table {
  public:

@@ -56,5 +56,30 @@ TEST(IndentedLines, IndentsEachLine) {
   EXPECT_EQ(indentedLines("", "  "), "  \n");
 }
 
+TEST(Wrapped, BreaksLinesOfMoreThan80ColumnsAtBlanks) {
+  const std::string forty(40, 'a');
+  const std::string thirtyNine(39, 'b');
+  const std::string quoted = "`" + std::string(30, 'c') + " " + std::string(30, 'd') + "`";
+  struct Row {
+    const char* name;
+    std::string text;
+    std::string lines;
+  };
+  const Row rows[] = {
+      {"a short text", "one two", "- one two\n"},
+      {"nothing", "", "- \n"},
+      {"80 columns", "a" + forty.substr(3) + " " + thirtyNine, "- a" + forty.substr(3) + " " + thirtyNine + "\n"},
+      {"81 columns", "a" + forty.substr(2) + " " + thirtyNine, "- a" + forty.substr(2) + "\n  " + thirtyNine + "\n"},
+      {"code points, not bytes", forty.substr(3) + "\xC3\xA9 " + thirtyNine,
+       "- " + forty.substr(3) + "\xC3\xA9 " + thirtyNine + "\n"},
+      {"several blanks", "one  two ", "- one two\n"},
+      {"a word that is too long", "one " + forty + forty + " two", "- one\n  " + forty + forty + "\n  two\n"},
+      {"back quotes", "it is " + forty + " " + quoted + ".", "- it is " + forty + "\n  " + quoted + ".\n"},
+      {"a back quote without an end", "one `two three", "- one `two three\n"},
+      {"control characters", "one\ntwo", "- one\\x0atwo\n"},
+  };
+  for (const Row& row : rows) EXPECT_EQ(wrapped(row.text, "- ", "  "), row.lines) << row.name;
+}
+
 }  // namespace
 }  // namespace quazor

@@ -1,7 +1,7 @@
 // Records for tests of reports.
 #pragma once
 
-#include "host/diagnostic_run.h"
+#include "host/diagnostic_record.h"
 
 #include <chrono>
 #include <memory>

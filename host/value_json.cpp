@@ -54,11 +54,7 @@ Json valueJson(const Value& value) {
   return defaultText(value);
 }
 
-Json dictionaryJson(const Dictionary& dictionary) {
-  Json json = Json::object();
-  for (const auto& [key, value] : dictionary) json.emplace(key, valueJson(value));
-  return json;
-}
+Json dictionaryJson(const Dictionary& dictionary) { return objectJson(dictionary, valueJson); }
 
 Json errorJson(const DiagnosticErrorPtr& error) {
   return error == nullptr ? Json() : dictionaryJson(error->dictionaryRepresentation());

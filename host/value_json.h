@@ -8,6 +8,7 @@
 
 #include <chrono>
 #include <string>
+#include <utility>
 
 namespace quazor {
 
@@ -20,6 +21,15 @@ nlohmann::ordered_json secondsJson(std::chrono::nanoseconds duration);
 // Numbers keep their kind, 32-bit floats their shortest decimal form, and not-finite ones follow numberJson; bytes are
 // hexadecimal text; dates, objects and errors are their default text.
 nlohmann::ordered_json valueJson(const Value& value);
+
+// An object with a key for each entry, made in linear time: the map has found out that no key is there twice.
+template <class T, class ToJson>
+nlohmann::ordered_json objectJson(const OrderedMap<T>& map, ToJson&& toJson) {
+  nlohmann::ordered_json::object_t object;
+  object.reserve(map.size());
+  for (const auto& [key, value] : map) object.emplace_back(key, toJson(value));
+  return nlohmann::ordered_json(std::move(object));
+}
 nlohmann::ordered_json dictionaryJson(const Dictionary& dictionary);
 
 // The error's dictionary form, or null.

@@ -70,5 +70,18 @@ TEST(DocumentText, ReplacesWhatIsNotUtf8) {
 
 TEST(DocumentText, IndentsByTwo) { EXPECT_EQ(documentText(Json{{"a", 1}}), "{\n  \"a\": 1\n}\n"); }
 
+TEST(DictionaryJson, KeepsEveryKeyInItsOrder) {
+  Dictionary dictionary;
+  for (int i = 100; i > 0; --i) dictionary.set("key " + std::to_string(i), i);
+  const Json json = dictionaryJson(dictionary);
+  ASSERT_EQ(json.size(), dictionary.size());
+  int expected = 100;
+  for (const auto& [key, value] : json.items()) {
+    EXPECT_EQ(key, "key " + std::to_string(expected));
+    EXPECT_EQ(value, expected);
+    --expected;
+  }
+}
+
 }  // namespace
 }  // namespace quazor

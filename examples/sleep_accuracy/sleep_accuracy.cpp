@@ -3,13 +3,20 @@
 #include "frame/lab.h"
 #include "platform/platform.h"
 
+#include <chrono>
 #include <memory>
+#include <string_view>
+#include <utility>
 
 namespace {
 
 using namespace quazor;
 
 constexpr std::string_view kLateness = "Lateness";
+constexpr int kBadParameterValue = 5;   // of QZErrorDomain, for all plug-ins
+constexpr int kMissingMeasurement = 6;  // likewise
+constexpr std::string_view kSleepAccuracyErrorDomain = "SleepAccuracyErrorDomain";
+constexpr int kClockStoodStill = 1;  // of the domain above
 
 // A unit is known by its symbol; there need not have been one before.
 const QZUnit& milliseconds() { return QZUnit::unitWithSymbol("ms"); }
@@ -17,28 +24,34 @@ const QZUnit& milliseconds() { return QZUnit::unitWithSymbol("ms"); }
 // Sleeps once, and measures by how much longer that took than it should have.
 class SleepAccuracyExperiment final : public QZExperiment {
  public:
+  explicit SleepAccuracyExperiment(const Platform& platform = installedPlatform()) : clock_(platform.clock) {}
+
   QZDescription experimentDescription() const override {
     QZDescription description("Sleep once and measure how late the thread wakes.");
     description.addParameter(QZNumberParameter("How long to sleep, in seconds.", true), "duration");
     return description;
   }
 
-  bool setupWithParameters(const Dictionary& parameters, QZDiagnosticHost* /*host*/,
-                           DiagnosticErrorPtr* error) override {
+  bool setupWithParameters(const Dictionary& parameters, QZDiagnosticHost*, DiagnosticErrorPtr* error) override {
     const double seconds = toDouble(parameters.find("duration"));
-    if (!(seconds > 0)) {  // not-a-number is refused too
-      fail(error, QZErrorDomain, 5, nullptr, "duration must be more than 0 seconds, not %@", seconds);
+    if (!(seconds >= 0.001)) {  // not-a-number is refused too
+      fail(error, QZErrorDomain, kBadParameterValue, nullptr, "duration must be at least 0.001 s, not %@", seconds);
       return false;
     }
     duration_ = nanosecondsFromSeconds(seconds);
     return true;
   }
 
-  std::unique_ptr<QZExperimentResult> run(DiagnosticErrorPtr* /*error*/) override {
-    Clock& clock = *installedPlatform().clock;
-    const auto start = clock.now();
-    clock.sleep(duration_);
-    const std::chrono::duration<double, std::milli> lateness = clock.now() - start - duration_;
+  std::unique_ptr<QZExperimentResult> run(DiagnosticErrorPtr* error) override {
+    const auto start = clock_->now();
+    clock_->sleep(duration_);
+    const auto slept = clock_->now() - start;
+    if (slept.count() <= 0) {
+      logError("The clock stood still at %@ ns.", start.count());
+      fail(error, kSleepAccuracyErrorDomain, kClockStoodStill, nullptr, "The clock stood still during the sleep.");
+      return nullptr;
+    }
+    const std::chrono::duration<double, std::milli> lateness = slept - duration_;
     logDebug("Slept, and woke %lf ms late.", lateness.count());
     auto result = std::make_unique<QZExperimentResult>();
     result->measurements().set(kLateness, Measurement(lateness.count(), milliseconds()));
@@ -46,6 +59,7 @@ class SleepAccuracyExperiment final : public QZExperiment {
   }
 
  private:
+  const std::shared_ptr<Clock> clock_;
   std::chrono::nanoseconds duration_{};
 };
 
@@ -60,7 +74,7 @@ class SleepAccuracyAnalysis final : public QZAnalysis {
                                                             DiagnosticErrorPtr* error) override {
     const Measurement* lateness = result.measurements().find(kLateness);
     if (lateness == nullptr) {
-      fail(error, QZErrorDomain, 6, nullptr, "The experiment did not measure %@.", kLateness);
+      fail(error, QZErrorDomain, kMissingMeasurement, nullptr, "The experiment did not measure %@.", kLateness);
       return nullptr;
     }
     QZLimit limit("LatenessLimit");

@@ -1,0 +1,87 @@
+"""What the tests of the program's command line share.
+
+CTest gives the program and the directory of the test plug-ins in the environment.
+"""
+
+import json
+import os
+import pathlib
+import signal
+import subprocess
+import tempfile
+import unittest
+
+PROGRAM = os.environ["QUAZOR_PROGRAM"]
+PLUGINS = pathlib.Path(os.environ["QUAZOR_TEST_PLUGINS"])
+WORKING = str(PLUGINS / "working_plugin.so")
+EXPERIMENTS = str(PLUGINS / "experiments_plugin.so")
+
+# The record of the last run goes there, unless a test has a place of its own for it.
+STATE = tempfile.TemporaryDirectory()
+os.environ["XDG_STATE_HOME"] = STATE.name
+os.environ.pop("QUAZOR_SET", None)
+
+SCENARIO = {
+    "title": "One camera",
+    "cameras": {"wide": {"port": "BackFacingCamera", "formats": [{"maximumFrameRate": 30}]}},
+    "groups": {"back": {"cameras": ["wide"], "master": "wide"}},
+    "faults": [],
+}
+UNFIRED_FAULT = {"operation": "CaptureStream.start", "action": "fail"}
+
+
+def quazor(*arguments, **options):
+    environment = {key: value for key, value in os.environ.items() if key not in ("NO_COLOR", "TERM")}
+    environment.update(options.pop("env", {}))
+    options.setdefault("stdout", subprocess.PIPE)
+    return subprocess.run([PROGRAM, *map(str, arguments)], stderr=subprocess.PIPE, text=True, timeout=120,
+                          env=environment, **options)
+
+
+def start(*arguments, ignored=False, **options):
+    """The running program. Interrupts have their usual meaning in it, or are ignored, as in a shell's background."""
+    action = signal.SIG_IGN if ignored else signal.SIG_DFL
+    return subprocess.Popen([PROGRAM, *map(str, arguments)], stdout=subprocess.PIPE, stderr=subprocess.PIPE, text=True,
+                            preexec_fn=lambda: signal.signal(signal.SIGINT, action), **options)
+
+
+def events_in(record):
+    """The events of a record, which must be whole lines."""
+    text = pathlib.Path(record).read_text()
+    assert text.endswith("\n"), text[-100:]
+    return [json.loads(line) for line in text.splitlines()]
+
+
+class CommandLineTest(unittest.TestCase):
+    def setUp(self):
+        directory = tempfile.TemporaryDirectory()
+        self.addCleanup(directory.cleanup)
+        self.directory = pathlib.Path(directory.name)
+        self.phone = self.write("phone.json", json.dumps(SCENARIO))
+        self.output = self.directory / "out.json"
+
+    def write(self, name, content):
+        path = self.directory / name
+        path.write_text(content)
+        return path
+
+    def run_fake(self, *arguments, names=("Fake.One",), duration=1, **options):
+        """Runs the fake diagnostic, which passes unless the arguments say otherwise."""
+        fixed = ["--plugin", WORKING, "--phone", self.phone, "--profile", "none"]
+        if duration is not None:
+            fixed += ["--set", f"duration={duration}"]
+        return quazor("run", *names, *fixed, *arguments, **options)
+
+    def assert_verifies(self, record):
+        result = quazor("verify", record)
+        self.assertEqual(result.returncode, 0, result.stdout + result.stderr)
+
+    def assert_refused(self, result, code, *texts):
+        """The exit code, every text on standard error, nothing on standard output, and nothing touched."""
+        self.assertEqual(result.returncode, code, result.stderr)
+        self.assertTrue(result.stderr.startswith("quazor: "), result.stderr)
+        for text in texts:
+            self.assertIn(text, result.stderr)
+        self.assertEqual(result.stdout, "")
+        self.assertFalse(self.output.exists())
+        self.assertEqual([path.name for path in self.directory.glob("*.tmp")], [])

@@ -1,0 +1,59 @@
+// Running plug-ins in processes of their own.
+#pragma once
+
+#include "host/catalogue.h"
+#include "host/child_process.h"
+#include "host/deadlines.h"
+#include "host/diagnostic_run.h"
+#include "host/parameters.h"
+#include "host/progress.h"
+#include "host/run_event.h"
+
+#include <cstdint>
+#include <filesystem>
+#include <functional>
+#include <memory>
+#include <optional>
+#include <string>
+#include <vector>
+
+namespace quazor {
+
+struct IsolationOptions {
+  std::vector<std::filesystem::path> plugins;
+  std::optional<std::uint64_t> memory;  // the most address space of a process, in bytes; nothing: as the system has it
+  std::vector<DeadlineSetting> deadlines;
+};
+
+// A plug-in that could not be loaded because its process did not survive it.
+struct FailedPlugin {
+  std::filesystem::path file;
+  DiagnosticErrorPtr error;
+};
+
+// Without the plug-ins that failed, which would end every process that loads them.
+IsolationOptions withoutFailed(IsolationOptions options, const std::vector<FailedPlugin>& failed);
+
+// What the plug-ins have, without their factories, and those of them that could not be loaded.
+struct Survey {
+  std::vector<DescribedDiagnostic> catalogue;
+  std::vector<FailedPlugin> failed;
+  bool interrupted = false;
+};
+
+// Loads the plug-ins in a process of their own and asks what is in them; only that for which `isDescribed` holds is
+// asked for its description. A plug-in that ends its process while it is loaded is left out and told in `failed`; what
+// ends its process while it is described has that as its description's error. Throws the Refusals of loadPlugins.
+Survey surveyPlugins(const IsolationOptions& options, WatchedSignals& signals,
+                     const std::function<bool(const Diagnostic&)>& isDescribed);
+
+// As runDiagnostic, in a process of its own in which the plug-ins are loaded anew. Whatever ends that process before
+// its time becomes a Failed event of the stage it was in, and there is no DiagnosticCompleted then. What it writes to
+// its standard output and error stream become log lines. False when the user interrupted it.
+//
+// `result`, if it is not null, is analysed, and no experiment is run.
+bool runIsolated(const IsolationOptions& options, WatchedSignals& signals, const Diagnostic& diagnostic,
+                 const BoundParameters& parameters, const RunOptions& runOptions, const QZExperimentResult* result,
+                 Progress& progress, RunEventSink& events);
+
+}  // namespace quazor

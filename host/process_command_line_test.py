@@ -1,0 +1,286 @@
+"""Plug-ins in processes of their own, parameters from all their places, and interrupts, as users of the program meet
+them."""
+
+import json
+import os
+import pathlib
+import resource
+import signal
+import time
+import unittest
+
+from command_line_fixture import PLUGINS, WORKING, CommandLineTest, events_in, quazor, start
+
+FATAL = str(PLUGINS / "fatal_plugin.so")
+UNRULY = str(PLUGINS / "unruly_plugin.so")
+
+
+class ParametersTest(CommandLineTest):
+    def profile(self, name, **values):
+        return self.write(name, json.dumps({"schema": 1, "diagnostics": {"Fake.*": {"experiment": values}}}))
+
+    def described(self, *arguments, **options):
+        """Value and source of the experiment's parameters."""
+        result = quazor("describe", "Fake.One", "--plugin", WORKING, "--format", "json", *arguments, **options)
+        self.assertEqual(result.returncode, 0, result.stderr)
+        parameters = json.loads(result.stdout)["diagnostics"][0]["experiment"]["parameters"]
+        return {one["name"]: (one["value"], one["source"]) for one in parameters if one.get("value") is not None}
+
+    def test_the_last_place_that_has_a_value_wins(self):
+        profile = self.profile("profile.json", duration=1, measured=1, behaviour=0)
+        first = ["--profile", profile]
+        more = [*first, "--parameters", self.profile("more.json", measured=2)]
+        most = [*more, "--parameters", self.profile("most.json", measured=3)]
+        rows = [
+            (first, {}, (1, "profile profile.json")),
+            (more, {}, (2, "profile more.json")),
+            (most, {}, (3, "profile most.json")),
+            (most, {"QUAZOR_SET": "measured=4"}, (4, "environment")),
+            ([*most, "--set", "measured=5"], {}, (5, "command line")),
+            ([*most, "--set", "measured=5"], {"QUAZOR_SET": "measured=4"}, (5, "command line")),
+            (["--profile", "none"], {"QUAZOR_SET": "  experiment.measured=4\tduration=2 "}, (4, "environment")),
+        ]
+        for arguments, env, measured in rows:
+            with self.subTest(arguments, env=env):
+                described = self.described(*arguments, env=env)
+                self.assertEqual(described["measured"], measured)
+        self.assertEqual(self.described(*most, env={"QUAZOR_SET": "measured=4"})["duration"],
+                         (1, "profile profile.json"))
+
+    def test_a_run_has_them(self):
+        result = self.run_fake("--parameters", self.profile("more.json", measured=2), "--format", "json",
+                               env={"QUAZOR_SET": "minimum=3"})
+        self.assertEqual(result.returncode, 1, result.stderr)
+        record, = json.loads(result.stdout)["diagnostics"]
+        self.assertEqual(record["parameters"], {"experiment": {"duration": 1, "measured": 2},
+                                                "analysis": {"minimum": 3}})
+
+    def test_what_is_refused_of_files(self):
+        rows = [
+            (self.directory / "missing.json", "cannot be read: No such file or directory"),
+            (self.write("empty.json", ""), "cannot be parsed"),
+            (self.directory, "is a directory"),
+            (self.profile("typo.json", measurd=1), "did you mean 'measured'?"),
+            (self.write("other.json", '{"schema": 1, "diagnostics": {"Fake.Oen": {}}}'), "fits no diagnostic"),
+        ]
+        for path, problem in rows:
+            with self.subTest(problem):
+                self.assert_refused(self.run_fake("--parameters", path), 66, f"the profile '{path}'", problem)
+        self.assert_refused(self.run_fake("--parameters", ""), 64, "--parameters: its value is empty")
+
+    def test_what_is_refused_of_the_environment(self):
+        rows = {"measured": "it must have the form", "measured=": "a number is missing",
+                "measured=nan": "not a finite number", "measurd=1": "did you mean 'measured'?",
+                "measured=1 measured=2": "set the same parameter twice", "measured=1e999": "outside the range"}
+        for text, problem in rows.items():
+            with self.subTest(text):
+                self.assert_refused(self.run_fake(env={"QUAZOR_SET": text}), 64, "QUAZOR_SET '", problem)
+
+
+class ProcessTest(CommandLineTest):
+    def run_unruly(self, way, *arguments, names=("Unruly",), **options):
+        return quazor("run", *names, "--plugin", UNRULY, "--phone", self.phone, "--profile", "none", "--set",
+                      f"way={way}", *arguments, **options)
+
+    def test_a_crash_ends_one_diagnostic_and_not_the_run(self):
+        record = self.directory / "run.jsonl"
+        result = quazor("run", "Unruly", "Fake.One", "--plugin", UNRULY, "--plugin", WORKING, "--phone", self.phone,
+                        "--profile", "none", "--set", "way=1", "--set", "duration=1", "--record", record)
+        self.assertEqual(result.returncode, 2)
+        self.assertIn("QuazorHostErrorDomain code 6: the stage run of Unruly crashed: its process was ended by signal "
+                      "6 (SIGABRT)", result.stdout)
+        self.assertIn("2 diagnostics: 1 passed, 0 failed, 1 ended in an error", result.stdout)
+        self.assert_verifies(record)
+
+    def test_an_exit_is_an_error(self):
+        result = self.run_unruly(2)
+        self.assertEqual(result.returncode, 2)
+        self.assertIn("code 7: the stage run of Unruly ended its own process, with exit code 3", result.stdout)
+
+    def test_a_deadline_ends_what_takes_longer(self):
+        for arguments in (["--deadline", "0.2"], ["--deadline", "run=0.2"], ["--deadline", "60", "--deadline", "run=0.2"]):
+            with self.subTest(arguments):
+                begin = time.monotonic()
+                result = self.run_unruly(3, *arguments)
+                self.assertLess(time.monotonic() - begin, 20)
+                self.assertEqual(result.returncode, 2)
+                self.assertIn("code 8: the stage run of Unruly took longer than its deadline of 0.2 s", result.stdout)
+
+    def test_a_deadline_of_another_stage_is_not_its(self):
+        result = self.run_fake("--realtime", "--deadline", "analyse=0.05", "--deadline", "setup=0.05", duration=0.3)
+        self.assertEqual(result.returncode, 0, result.stdout)
+
+    def test_deadlines_that_are_refused(self):
+        for text, problem in {"": "a number is missing", "0": "above zero", "-1": "above zero", "soon": "not a number",
+                              "nan": "not a finite number", "runn=1": "there is no stage 'runn'",
+                              "run=": "a number is missing"}.items():
+            with self.subTest(text):
+                self.assert_refused(self.run_fake("--deadline", text), 64, f"--deadline '{text}'", problem)
+
+    def test_memory_that_is_refused(self):
+        for text in ("0", "-1", "1.5", "much", "17592186044416", "1g"):
+            with self.subTest(text):
+                self.assert_refused(self.run_fake("--memory", text), 64, f"--memory '{text}'")
+
+    def test_a_memory_that_is_too_small_for_anything_is_refused(self):
+        self.assert_refused(self.run_fake("--memory", "1"), 66, f"the plug-in '{WORKING}' cannot be loaded: ")
+
+    def test_as_much_memory_as_there_is(self):
+        self.assertEqual(self.run_fake("--memory", "none").returncode, 0)
+
+    def test_in_process_and_isolated_runs_report_the_same(self):
+        for arguments, code in ((["--set", "measured=3"], 0), (["--set", "minimum=1"], 1),
+                                (["--set", "experiment.behaviour=5"], 2), (["--set", "experiment.behaviour=9"], 2)):
+            with self.subTest(arguments):
+                isolated = self.run_fake("--format", "json", *arguments, names=["Fake.*"])
+                here = self.run_fake("--format", "json", "--in-process", *arguments, names=["Fake.*"])
+                self.assertEqual((isolated.returncode, here.returncode), (code, code))
+                self.assertEqual(isolated.stdout, here.stdout)
+
+    def test_in_process_all_ends_with_a_crash(self):
+        record = self.directory / "run.jsonl"
+        result = self.run_unruly(1, "--in-process", "--record", record)
+        self.assertEqual(result.returncode, -signal.SIGABRT)
+        self.assertEqual(quazor("verify", record).returncode, 0)
+
+    def test_a_plugin_that_cannot_be_loaded_is_told(self):
+        text = f"quazor: loading the plug-in '{FATAL}' crashed: its process was ended by signal 6 (SIGABRT)\n"
+        listed = quazor("list", "--plugin", FATAL, "--plugin", WORKING)
+        self.assertEqual((listed.returncode, listed.stderr), (66, text))
+        self.assertIn("Fake.One", listed.stdout)
+        described = quazor("describe", "Fake.One", "--plugin", FATAL, "--plugin", WORKING, "--profile", "none")
+        self.assertEqual((described.returncode, described.stderr), (66, text))
+        ran = quazor("run", "--all", "--plugin", FATAL, "--phone", self.phone, "--profile", "none")
+        self.assertEqual(ran.returncode, 2)
+
+    def test_what_a_plugin_prints_is_kept_apart_from_the_report(self):
+        result = self.run_unruly(7, "--format", "json")
+        self.assertEqual(result.returncode, 0, result.stderr)
+        log = [line["text"] for line in json.loads(result.stdout)["diagnostics"][0]["log"]]
+        self.assertIn("output: printed", log)
+        self.assertIn("output: twice", log)
+
+    def test_a_diagnostic_that_cannot_be_described_does_not_run(self):
+        result = self.run_unruly(0, "--format", "json", "--plugin", PLUGINS / "undescribable_plugin.so",
+                                 names=["Fatal", "Unruly"])
+        self.assertEqual(result.returncode, 2)
+        fatal, unruly = json.loads(result.stdout)["diagnostics"]
+        self.assertEqual((fatal["error"]["code"], fatal["durations"]["setup"]), (7, None))
+        self.assertEqual(unruly["verdict"], "pass")
+
+    def test_it_runs_where_the_ends_of_children_are_ignored(self):
+        begin = time.monotonic()
+        result = self.run_fake(preexec_fn=lambda: signal.signal(signal.SIGCHLD, signal.SIG_IGN))
+        self.assertEqual(result.returncode, 0, result.stdout)
+        self.assertLess(time.monotonic() - begin, 4)
+
+    def test_it_runs_with_few_descriptors(self):
+        result = self.run_fake(preexec_fn=lambda: resource.setrlimit(resource.RLIMIT_NOFILE, (64, 64)))
+        self.assertEqual(result.returncode, 0, result.stdout + result.stderr)
+
+
+class InterruptTest(CommandLineTest):
+    NAMES = ("Broken.Nothing", "Fake.One", "Fake.Two")
+
+    def setUp(self):
+        super().setUp()
+        self.record = self.directory / "run.jsonl"
+
+    def interrupted(self, *arguments, signals=(signal.SIGINT,)):
+        """Runs one diagnostic that ends at once and two that take too long, and interrupts the second."""
+        process = start("run", *self.NAMES, "--plugin", WORKING, "--phone", self.phone, "--profile", "none",
+                        "--realtime", "--set", "duration=60", "--record", self.record, *arguments)
+        self.addCleanup(process.kill)
+        line = process.stderr.readline()  # the run's first log line: it is in the second diagnostic
+        self.assertIn("an error line", line)
+        begin = time.monotonic()
+        for one in signals:
+            process.send_signal(one)
+        out, err = process.communicate(timeout=30)
+        self.assertLess(time.monotonic() - begin, 20)
+        self.assertEqual(process.returncode, 130)
+        self.assertIn("interrupted while Fake.One was running", err)
+        self.assert_verifies(self.record)
+        events = events_in(self.record)
+        self.assertEqual((events[-1]["event"], events[-1]["interrupted"]), ("runEnded", "Fake.One"))
+        return out
+
+    WAYS = ([], ["--in-process"])
+
+    def test_json_stays_one_document_with_all_that_ran(self):
+        for way in self.WAYS:
+            with self.subTest(way):
+                document = json.loads(self.interrupted("--format", "json", *way))
+                self.assertEqual([(record["name"], record["verdict"]) for record in document["diagnostics"]],
+                                 [("Broken.Nothing", "error"), ("Fake.One", "error")])
+                self.assertEqual(document["interrupted"], "Fake.One")
+                error = document["diagnostics"][1]["error"]
+                self.assertEqual((error["domain"], error["code"]), ("QuazorHostErrorDomain", 11))
+                self.assertIn("an error line", [line["text"] for line in document["diagnostics"][1]["log"]])
+
+    def test_text_shows_all_that_ran(self):
+        for way in self.WAYS:
+            with self.subTest(way):
+                out = self.interrupted(*way)
+                self.assertIn("Broken.Nothing", out)
+                self.assertRegex(out, r"QuazorHostErrorDomain code 11: .*Fake\.One was interrupted")
+                self.assertIn("2 diagnostics: 0 passed, 0 failed, 2 ended in an error", out)
+
+    def test_every_output_file_is_written(self):
+        for way in self.WAYS:
+            with self.subTest(way):
+                junit = self.directory / "report.xml"
+                self.interrupted("--format", "json", "--output", self.output, "--output", f"junit:{junit}", *way)
+                self.assertEqual(json.loads(self.output.read_text())["interrupted"], "Fake.One")
+                self.assertIn("Fake.Two", junit.read_text())
+                self.output.unlink()
+
+    def test_a_termination_ends_a_run_as_an_interrupt_does(self):
+        self.interrupted(signals=[signal.SIGTERM])
+
+    def test_two_interrupts_end_it_as_well(self):
+        self.interrupted(signals=[signal.SIGINT, signal.SIGTERM])
+
+    def test_an_interrupt_behind_the_end_of_a_diagnostic_is_one_between_two(self):
+        process = start("run", "Unruly", "Fake.One", "--plugin", UNRULY, "--plugin", WORKING, "--phone", self.phone,
+                        "--profile", "none", "--set", "way=12", "--set", "duration=1", "--record", self.record,
+                        "--format", "json")
+        out, err = process.communicate(timeout=30)
+        self.assertEqual(process.returncode, 130, err)
+        self.assertIn("interrupted between two diagnostics", err)
+        document = json.loads(out)
+        self.assertEqual((len(document["diagnostics"]), document["interrupted"]), (1, ""))
+        self.assertEqual(events_in(self.record)[-1]["interrupted"], "")
+        self.assert_verifies(self.record)
+
+    def test_what_was_interrupted_can_be_run_then(self):
+        self.interrupted()
+        result = self.run_fake("--only", "failed", "--of", self.record, "--format", "json", names=[])
+        self.assertEqual([record["name"] for record in json.loads(result.stdout)["diagnostics"]], list(self.NAMES))
+
+    def test_an_interrupt_while_plugins_are_loaded(self):
+        process = start("run", "--all", "--plugin", FATAL, "--phone", self.phone, "--profile", "none", "--record",
+                        self.record, env={**os.environ, "FATAL_PLUGIN": "hang"})
+        self.addCleanup(process.kill)
+        children = pathlib.Path(f"/proc/{process.pid}/task/{process.pid}/children")
+        limit = time.monotonic() + 20
+        while not children.read_text() and time.monotonic() < limit:
+            time.sleep(0.01)
+        process.send_signal(signal.SIGINT)
+        out, err = process.communicate(timeout=30)
+        self.assertEqual((process.returncode, out), (130, ""))
+        self.assertIn("interrupted while the plug-ins were loaded", err)
+        self.assertFalse(self.record.exists())
+
+    def test_ignored_interrupts_stay_ignored(self):
+        process = start("run", "Fake.One", "--plugin", WORKING, "--phone", self.phone, "--profile", "none",
+                        "--realtime", "--set", "duration=0.5", "--log-level", "error", ignored=True)
+        self.addCleanup(process.kill)
+        self.assertIn("an error line", process.stderr.readline())
+        process.send_signal(signal.SIGINT)
+        out, _ = process.communicate(timeout=30)
+        self.assertEqual(process.returncode, 0, out)
+
+
+if __name__ == "__main__":
+    unittest.main()

@@ -1,0 +1,383 @@
+"""Records as users of the program meet them: made, verified, analysed again, compared, and run from."""
+
+import json
+import pathlib
+import random
+import unittest
+import xml.etree.ElementTree
+
+from command_line_fixture import EXPERIMENTS, PLUGINS, WORKING, CommandLineTest, events_in, quazor
+
+
+class RecordTest(CommandLineTest):
+    def setUp(self):
+        super().setUp()
+        self.record = self.directory / "run.jsonl"
+
+    def recorded(self, *arguments, code=0, record=None, **options):
+        """A record of a run of the fake diagnostic."""
+        record = record or self.record
+        result = self.run_fake("--record", record, *arguments, **options)
+        self.assertEqual(result.returncode, code, result.stderr)
+        return record
+
+    def changed(self, change):
+        """A copy of the record with changed events."""
+        events = events_in(self.record)
+        change(events)
+        return self.write("changed.jsonl", "".join(json.dumps(event) + "\n" for event in events))
+
+
+class MakingTest(RecordTest):
+    def test_a_record_holds_all_of_a_run(self):
+        events = events_in(self.recorded("--set", "measured=90", "--seed", "9", names=["Fake.*"]))
+        self.assertEqual([event["sequence"] for event in events], list(range(len(events))))
+        self.assertEqual(events[0]["record"], 1)
+        self.assertEqual(events[0]["names"], ["Fake.One", "Fake.Two"])
+        self.assertEqual((events[0]["seed"], events[0]["phone"], events[0]["plugins"]), (9, str(self.phone), [WORKING]))
+        ended = [event["verdict"] for event in events if event["event"] == "diagnosticEnded"]
+        self.assertEqual(ended, ["pass", "pass"])
+        self.assertEqual(events[-1]["event"], "runEnded")
+        self.assertNotIn("interrupted", events[-1])
+        self.assert_verifies(self.record)
+
+    def test_every_verdict_is_recorded_and_verifies(self):
+        for arguments, code, verdict in (([], 0, "pass"), (["--set", "minimum=1"], 1, "fail"),
+                                         (["--set", "experiment.behaviour=5"], 2, "error")):
+            with self.subTest(verdict):
+                events = events_in(self.recorded(*arguments, code=code))
+                self.assertEqual(events[-2]["verdict"], verdict)
+                self.assert_verifies(self.record)
+
+    def test_an_experiment_is_recorded_too(self):
+        result = quazor("experiment", "Alone.*", "--plugin", EXPERIMENTS, "--phone", self.phone, "--profile", "none",
+                        "--set", "images=1", "--set", "duration=1", "--record", self.record)
+        self.assertEqual(result.returncode, 2)
+        self.assertTrue(events_in(self.record)[0]["ofExperiments"])
+        self.assert_verifies(self.record)
+
+    def test_a_plugin_that_cannot_be_loaded_stands_in_the_record(self):
+        result = quazor("run", "--all", "--plugin", PLUGINS / "fatal_plugin.so", "--plugin", WORKING, "--profile",
+                        "none", "--set", "duration=1", "--phone", self.phone, "--record", self.record)
+        self.assertEqual(result.returncode, 2)
+        self.assertEqual(events_in(self.record)[0]["names"][:2], ["fatal_plugin.so", "Fake.One"])
+        self.assertIn("fatal_plugin.so' crashed: its process was ended by signal 6 (SIGABRT)", result.stdout)
+        self.assert_verifies(self.record)
+
+    def test_a_record_that_cannot_be_made_is_refused_before_anything_runs(self):
+        rows = {self.directory / "nowhere" / "out": "No such file or directory", self.directory: "it is a directory",
+                self.phone / "out": "Not a directory"}
+        for path, why in rows.items():
+            with self.subTest(path):
+                self.assert_refused(self.run_fake("--record", path), 73,
+                                    f"the record '{path}' cannot be written: {why}")
+        self.assert_refused(self.run_fake("--record", ""), 64, "--record: its value is empty")
+
+    def test_a_record_that_turns_out_not_to_be_writable_is_an_error(self):
+        result = self.run_fake("--record", "/dev/full")
+        self.assertEqual(result.returncode, 2)
+        self.assertIn("QuazorHostErrorDomain code 10: the record '/dev/full' cannot be written", result.stdout)
+
+    def test_a_file_is_not_written_twice(self):
+        one = self.write("one", "precious")
+        (self.directory / "link").symlink_to(one)
+        for arguments in (["--record", "one", "--output", "one"], ["--output", "json:one", "--output", "csv:./one"],
+                          ["--record", "one", "--output", "junit:link"],
+                          ["--record", "new", "--output", f"../{self.directory.name}/new"]):
+            with self.subTest(arguments):
+                result = self.run_fake(*arguments, cwd=self.directory)
+                self.assert_refused(result, 64, "is to be written twice")
+                self.assertEqual(one.read_text(), "precious")
+        self.assertEqual(self.run_fake("--record", "/dev/null", "--output", "/dev/null").returncode, 0)
+
+
+class VerifyTest(RecordTest):
+    def setUp(self):
+        super().setUp()
+        self.recorded("--set", "measured=90", "--set", "minimum=90")
+
+    def test_it_counts_what_it_has_seen(self):
+        result = quazor("verify", self.record)
+        self.assertEqual((result.returncode, result.stderr), (0, ""))
+        self.assertRegex(result.stdout, r"^\d+ events, 1 verdict, 0 problems\n$")
+
+    def test_it_finds_what_was_changed(self):
+        def of(events, kind):
+            return next(event for event in events if event["event"] == kind)
+
+        def without(kind):
+            def change(events):
+                events.remove(of(events, kind))
+                for number, event in enumerate(events):
+                    event["sequence"] = number
+            return change
+
+        def value(events):
+            of(events, "found")["results"][0]["measurement"][0] = 89.0
+
+        def limit(events):
+            of(events, "found")["results"][0]["limit"]["lower"][0][0] = 91.0
+
+        def unit(events):
+            of(events, "found")["results"][0]["measurement"][1] = "errors"
+
+        def verdict(events):
+            of(events, "diagnosticEnded")["verdict"] = "fail"
+
+        for change in (value, limit, unit, verdict, without("found"), without("diagnosticCompleted")):
+            with self.subTest(change.__name__):
+                result = quazor("verify", self.changed(change))
+                self.assertEqual(result.returncode, 1, result.stdout)
+                self.assertTrue(result.stdout.startswith("WRONG  Fake.One has the "), result.stdout)
+
+    def test_what_is_no_record_is_refused(self):
+        def missing_line(events):
+            del events[3]
+
+        def other_form(events):
+            events[0]["record"] = 2
+
+        rows = [
+            (self.directory / "missing", "cannot be read: No such file or directory"),
+            (self.directory, "cannot be read: it is a directory"),
+            (self.write("empty", ""), "holds no event"),
+            (self.write("text", "hello\n"), "line 1: it is no JSON"),
+            (self.phone, "holds no event"),
+            (self.write("document", "{}\n"), "line 1: \"record\" is missing"),
+            (WORKING, "line 1: it is no JSON"),
+            ("/dev/null", "holds no event"),
+        ]
+        for path, problem in rows:
+            with self.subTest(problem):
+                self.assert_refused(quazor("verify", path), 66, f"the record '{path}'", problem)
+        self.assert_refused(quazor("verify", self.changed(missing_line)), 66, "line 4: it has the sequence number 4")
+        self.assert_refused(quazor("verify", self.changed(other_form)), 66, "it has form 2, and this program reads")
+        self.assert_refused(quazor("verify"), 64, "RECORD")
+        self.assert_refused(quazor("verify", self.record, self.record), 64)
+        self.assert_refused(quazor("verify", ""), 64, "RECORD: its value is empty")
+
+    def test_a_record_that_was_cut_off_anywhere_is_not_wrong(self):
+        whole = self.record.read_bytes()
+        first = whole.index(b"\n")
+        for size in sorted(random.Random(1).sample(range(first + 1, len(whole)), 20)):
+            with self.subTest(size):
+                cut = self.directory / "cut"
+                cut.write_bytes(whole[:size])
+                result = quazor("verify", cut)
+                self.assertEqual(result.returncode, 0, result.stderr)
+                self.assertIn("The run did not come to its end", result.stdout)
+
+    def test_values_in_many_levels_do_not_crash_it(self):
+        deep = '{"array":[' * 100_000 + "]}" * 100_000
+        line = '{"sequence":1,"event":"collected","key":"k","value":' + deep + "}\n"
+        record = self.write("deep", self.record.read_text().splitlines(keepends=True)[0] + line)
+        self.assert_refused(quazor("verify", record), 66, "line 2: there are too many levels of values in a value")
+
+    def test_a_standard_output_that_is_full(self):
+        with open("/dev/full", "w") as full:
+            for command in (["verify", self.record], ["diff", self.record, self.record]):
+                result = quazor(*command, stdout=full)
+                self.assertEqual(result.returncode, 73)
+                self.assertIn("the standard output cannot be written", result.stderr)
+
+
+class AnalyzeTest(RecordTest):
+    def setUp(self):
+        super().setUp()
+        self.recorded("--set", "measured=90", "--set", "minimum=90", names=["Fake.*"])
+
+    def test_it_comes_to_the_same_verdict(self):
+        result = quazor("analyze", self.record)
+        self.assertEqual(result.returncode, 0, result.stderr)
+        self.assertTrue(result.stdout.endswith("2 diagnostics: 2 passed, 0 failed, 0 ended in an error\n"))
+
+    def test_it_takes_new_parameters_and_the_recorded_ones(self):
+        for arguments in (["--set", "minimum=91"], ["--set", "analysis.minimum=91"]):
+            result = quazor("analyze", self.record, *arguments, "--format", "json")
+            self.assertEqual(result.returncode, 1, result.stderr)
+            for record in json.loads(result.stdout)["diagnostics"]:
+                self.assertEqual(record["parameters"], {"experiment": {"duration": 1, "measured": 90},
+                                                        "analysis": {"minimum": 91}})
+                self.assertEqual(record["measuredResults"][0]["limit"]["lower"]["value"], 91.0)
+        record = self.directory / "again.jsonl"
+        self.assertEqual(quazor("analyze", self.record, "--record", record).returncode, 0)
+        parameter, _ = events_in(record)[1]["parameters"]["analysis"]
+        self.assertEqual(parameter["source"], "command line, in the record")
+
+    def test_its_record_can_be_verified_and_analysed_again(self):
+        record = self.directory / "again.jsonl"
+        self.assertEqual(quazor("analyze", self.record, "--set", "minimum=91", "--record", record).returncode, 1)
+        self.assert_verifies(record)
+        self.assertEqual(quazor("analyze", record).returncode, 1)
+        self.assertEqual(quazor("analyze", record, "--set", "minimum=90").returncode, 0)
+
+    def test_an_error_in_the_analysis(self):
+        result = quazor("analyze", self.record, "--set", "behaviour=22")
+        self.assertEqual(result.returncode, 2)
+        self.assertIn("FakeDomain code 6: analyzing failed", result.stdout)
+
+    def test_what_has_no_result_is_left_out(self):
+        self.recorded("--set", "duration=1", code=2, names=["Fake.One", "Broken.Nothing"], duration=None)
+        result = quazor("analyze", self.record)
+        self.assertEqual(result.returncode, 0, result.stderr)
+        self.assertIn("Broken.Nothing has no experiment's result in the record; it is left out", result.stderr)
+
+    def test_in_this_process(self):
+        result = quazor("analyze", self.record, "--in-process")
+        self.assertEqual(result.returncode, 0, result.stderr)
+
+    def test_what_is_refused(self):
+        self.assert_refused(quazor("analyze", self.directory / "missing"), 66, "cannot be read")
+        self.assert_refused(quazor("analyze"), 64, "RECORD")
+        self.assert_refused(quazor("analyze", self.record, "--set", "minimun=1"), 64, "did you mean 'minimum'?")
+        self.assert_refused(quazor("analyze", self.record, "--set", "measured=1"), 64,
+                            "no analysis of the diagnostics takes a parameter 'measured'")
+        self.assert_refused(quazor("analyze", self.record, "--set", "experiment.duration=1"), 64,
+                            "--set 'experiment.duration=1': analyze runs no experiment")
+        self.assert_refused(quazor("analyze", self.record, "--plugin", EXPERIMENTS), 64, "there is no diagnostic")
+        self.assert_refused(quazor("analyze", self.record, "--realtime"), 64, "--realtime")
+        self.assert_refused(quazor("analyze", self.record, "--plugin", self.directory / "no.so"), 66, "does not exist")
+
+    def test_a_record_without_results_is_refused(self):
+        self.recorded(code=2, names=["Broken.Nothing"], duration=None)
+        result = quazor("analyze", self.record)
+        self.assertEqual(result.returncode, 66)
+        self.assertIn("holds no experiment's result that could be analysed", result.stderr)
+
+
+class DiffTest(RecordTest):
+    def test_two_runs_with_one_seed_tell_the_same(self):
+        first = self.recorded("--set", "measured=90", names=["Fake.*"])
+        second = self.recorded("--set", "measured=90", names=["Fake.*"], record=self.directory / "second.jsonl")
+        result = quazor("diff", first, second)
+        self.assertEqual((result.returncode, result.stdout), (0, "The records tell the same.\n"))
+
+    def test_differences_are_told(self):
+        first = self.recorded("--set", "measured=90", "--set", "minimum=90")
+        second = self.recorded("--set", "measured=89", "--set", "minimum=90", code=1,
+                               record=self.directory / "second.jsonl", names=["Fake.*"])
+        result = quazor("diff", first, second)
+        self.assertEqual(result.returncode, 1)
+        self.assertEqual(result.stdout.splitlines(), [
+            "Fake.One: verdict was pass and is fail",
+            "Fake.One: parameter experiment.measured was 90 and is 89",
+            "Fake.One: measurement Count was 90 frames and is 89 frames",
+            "Fake.One: result Count was 90 frames, Enough: >= 90, pass and is 89 frames, Enough: >= 90, fail",
+            "Fake.One: result Echo was 90 frames, -, none and is 89 frames, -, none",
+            "Fake.Two is only in the second"])
+
+    def test_an_analysis_differs_only_in_what_it_makes_of_the_result(self):
+        first = self.recorded("--set", "measured=90")
+        second = self.directory / "second.jsonl"
+        quazor("analyze", first, "--record", second)
+        result = quazor("diff", first, second)
+        self.assertEqual((result.returncode, result.stdout), (0, "The records tell the same.\n"))
+
+    def test_what_is_refused(self):
+        record = self.recorded()
+        self.assert_refused(quazor("diff", record), 64, "RECORD")
+        self.assert_refused(quazor("diff", record, self.directory / "missing"), 66, "missing' cannot be read")
+        self.assert_refused(quazor("diff", self.phone, record), 66, "holds no event")
+
+
+class OnlyFailedTest(RecordTest):
+    def setUp(self):
+        super().setUp()
+        self.state = {"XDG_STATE_HOME": str(self.directory / "state")}
+
+    def run_names(self, *names, code):
+        # Nothing takes a parameter where nothing can be described.
+        result = self.run_fake(names=names, env=self.state, duration=1 if "Fake.One" in names else None)
+        self.assertEqual(result.returncode, code, result.stderr)
+
+    def only_failed(self, *arguments, duration=None):
+        return self.run_fake("--only", "failed", *arguments, names=[], env=self.state, duration=duration)
+
+    def test_it_runs_what_did_not_pass_the_last_time(self):
+        self.run_names("Fake.One", "Broken.Nothing", "Fake.Two", "Broken.Factory", code=2)
+        result = self.only_failed("--format", "json")
+        self.assertEqual(result.returncode, 2)
+        self.assertEqual([record["name"] for record in json.loads(result.stdout)["diagnostics"]],
+                         ["Broken.Nothing", "Broken.Factory"])
+
+    def test_what_passes_then_is_no_longer_among_them(self):
+        self.assertEqual(self.run_fake("--set", "minimum=1", names=["Fake.*"], env=self.state).returncode, 1)
+        self.assertEqual(self.only_failed(duration=1).returncode, 0)
+        result = self.only_failed()
+        self.assertEqual((result.returncode, result.stdout), (0, "Everything passed in the last run.\n"))
+
+    def test_it_takes_a_record(self):
+        self.recorded(code=2, names=["Fake.One", "Broken.Nothing"])
+        self.run_names("Fake.One", code=0)
+        result = self.only_failed("--of", self.record, "--format", "json")
+        self.assertEqual([record["name"] for record in json.loads(result.stdout)["diagnostics"]], ["Broken.Nothing"])
+
+    def test_experiments_and_analyses_are_no_last_run(self):
+        self.recorded("--set", "minimum=1", code=1)
+        self.run_names("Broken.Nothing", code=2)
+        quazor("analyze", self.record, env=self.state)
+        quazor("experiment", "FakeExperiment", "--plugin", WORKING, "--profile", "none", "--set", "duration=1",
+               "--phone", self.phone, env=self.state)
+        result = self.only_failed("--format", "json")
+        self.assertEqual([record["name"] for record in json.loads(result.stdout)["diagnostics"]], ["Broken.Nothing"])
+
+    def test_a_refused_run_is_no_last_run(self):
+        self.run_names("Broken.Nothing", code=2)
+        self.assertEqual(self.run_fake("--set", "bogus=1", env=self.state).returncode, 64)
+        result = self.only_failed("--format", "json")
+        self.assertEqual([record["name"] for record in json.loads(result.stdout)["diagnostics"]], ["Broken.Nothing"])
+
+    def test_what_is_refused(self):
+        self.assert_refused(self.only_failed(), 66, "there is no record of a last run; --of RECORD names one")
+        self.assert_refused(self.only_failed("--of", self.directory / "missing"), 66, "missing' cannot be read")
+        self.assert_refused(self.only_failed("--of", self.phone), 66, "holds no event")
+        self.assert_refused(self.only_failed("--all"), 64, "without names and without --all")
+        self.assert_refused(self.run_fake("--only", "failed"), 64, "without names and without --all")
+        self.assert_refused(self.run_fake("--of", self.phone), 64, "--of is for --only failed")
+        self.assert_refused(self.run_fake("--only", "faild", names=[]), 64, "--only: faild not in {failed}")
+
+    def test_a_place_for_the_last_run_that_cannot_be_used_changes_nothing(self):
+        for state in (str(self.phone), "relative", ""):
+            with self.subTest(state):
+                result = self.run_fake(env={"XDG_STATE_HOME": state, "HOME": str(self.directory)})
+                self.assertEqual(result.returncode, 0, result.stderr)
+
+
+class OutputsTest(RecordTest):
+    def test_one_run_in_every_format(self):
+        files = {name: self.directory / f"report.{name}" for name in ("text", "json", "csv", "ocp", "junit")}
+        outputs = [argument for name, file in files.items() for argument in ("--output", f"{name}:{file}")]
+        result = self.run_fake("--set", "minimum=1", *outputs)
+        self.assertEqual(result.returncode, 1, result.stderr)
+        self.assertEqual(files["text"].read_text(), result.stdout)
+        self.assertEqual(json.loads(files["json"].read_text())["diagnostics"][0]["verdict"], "fail")
+        self.assertTrue(files["csv"].read_text().splitlines()[1].startswith("Fake.One,fail,Count,"))
+        self.assertIn("testRunEnd", files["ocp"].read_text().splitlines()[-1])
+        suites = xml.etree.ElementTree.parse(files["junit"]).getroot()
+        self.assertEqual(suites.get("failures"), "1")
+
+    def test_the_report_itself_goes_to_a_file_without_a_format(self):
+        junit = self.directory / "report.xml"
+        result = self.run_fake("--format", "json", "--output", self.output, "--output", f"junit:{junit}")
+        self.assertEqual(result.stdout.splitlines()[0], "PASS  Fake.One")
+        self.assertEqual(json.loads(self.output.read_text())["diagnostics"][0]["verdict"], "pass")
+        self.assertTrue(junit.read_text().startswith("<?xml"))
+
+    def test_what_is_refused(self):
+        self.assert_refused(self.run_fake("--output", "json:"), 64, "--output 'json:': the file's name is missing")
+        self.assert_refused(self.run_fake("--output", "a", "--output", "b"), 64, "--output 'a' and --output 'b'")
+        self.assert_refused(quazor("list", "--plugin", WORKING, "--output", "a", "--output", "b"), 64,
+                            "one file is all that is written")
+
+    def test_a_format_that_is_none(self):
+        result = self.run_fake("--output", "xml:report", cwd=self.directory)
+        self.assert_refused(result, 64, "there is no format 'xml' (a file of this name is './xml:report')")
+        result = self.run_fake("--output", "jnuit:report", cwd=self.directory)
+        self.assert_refused(result, 64, "'./jnuit:report'); did you mean 'junit'?")
+        result = self.run_fake("--output", "./xml:report", cwd=self.directory)
+        self.assertEqual(result.returncode, 0, result.stderr)
+        self.assertIn("Fake.One", pathlib.Path(self.directory / "xml:report").read_text())
+
+
+if __name__ == "__main__":
+    unittest.main()

@@ -1,0 +1,25 @@
+// SharedCounter: a number that a process and the children it makes later both see.
+#pragma once
+
+#include <atomic>
+#include <cstdint>
+
+namespace quazor {
+
+// Any thread of any of the processes.
+class SharedCounter {
+ public:
+  // Throws std::system_error when the system refuses the memory.
+  SharedCounter();
+  SharedCounter(const SharedCounter&) = delete;
+  SharedCounter& operator=(const SharedCounter&) = delete;
+  ~SharedCounter();
+
+  void set(std::uint64_t number) { number_->store(number, std::memory_order_relaxed); }
+  std::uint64_t get() const { return number_->load(std::memory_order_relaxed); }
+
+ private:
+  std::atomic<std::uint64_t>* number_;
+};
+
+}  // namespace quazor

@@ -1,0 +1,21 @@
+// A plug-in for tests of the host: loading it ends the process or never ends. In the environment FATAL_PLUGIN says how:
+// "hang", or "=" and a line that it writes to its process' connection to quazor before it hangs.
+#include <unistd.h>
+
+#include <cstdlib>
+#include <string>
+
+namespace {
+
+[[gnu::constructor]] void endTheProcess() {
+  const char* const way = std::getenv("FATAL_PLUGIN");
+  if (way == nullptr) std::abort();
+  if (*way == '=') {
+    const std::string line = std::string(way + 1) + "\n";
+    constexpr int kConnection = 250;
+    if (::write(kConnection, line.data(), line.size()) < 0) std::abort();
+  }
+  for (;;) ::pause();
+}
+
+}  // namespace

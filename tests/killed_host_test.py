@@ -1,0 +1,157 @@
+#!/usr/bin/env python3
+"""Checks that a run whose program is killed leaves a record of everything that the user has seen, and no process.
+
+    killed_host_test.py PROGRAM PLUGINS
+
+PLUGINS is the directory with the plug-ins of misbehaving/. PROGRAM is killed (SIGKILL) at moments that are chosen by a
+seed: while it loads and describes plug-ins, while log lines flood, while a process sleeps and between two diagnostics.
+With QUAZOR_THOROUGH=1 in the environment there are 200 kills, otherwise 20; with QUAZOR_SEED, others.
+"""
+
+import collections
+import functools
+import json
+import os
+import pathlib
+import random
+import re
+import signal
+import subprocess
+import sys
+import tempfile
+import time
+import unittest
+
+from marked_processes import end_processes, environment_with_marker, processes_in
+
+KILLS = 200 if os.environ.get("QUAZOR_THOROUGH") == "1" else 20
+SEED = int(os.environ.get("QUAZOR_SEED", "1"))
+LONGEST_DEATH = 5.0  # seconds, until a child has noticed that its parent is gone
+COUNT = 2000  # of log lines, of measurements and of results
+# What is run, in this order: quiet and loud ones, and one that never ends.
+NAMES = ("CrashInRun", "LogFlood", "WellBehaved", "ManyMeasurements", "GarbageToOutput", "ForkIntoHost", "ManyResults",
+         "CrashInAnalysis", "CloseConnection", "Abort", "HangInRun")
+LOG_LINE = re.compile(r"(?:\d{4}-\d\d-\d\d )?\S+ (error|default|debug) quazor: (.*)")
+VERDICTS = {"PASS": "pass", "FAIL": "fail", "ERROR": "error"}
+
+
+def whole_lines(file):
+    """The lines of a file that have an end."""
+    content = file.read_bytes() if file.exists() else b""
+    return content.decode("utf-8", errors="surrogateescape").split("\n")[:-1]
+
+
+def shown_verdicts(lines):
+    """The names and verdicts of a text report: a name stands alone at the beginning of a line, its verdict below."""
+    name, shown = None, []
+    for line in lines:
+        if line and not line.startswith(" "):
+            name = line
+        elif line.strip() in VERDICTS:
+            shown.append((name, VERDICTS[line.strip()]))
+    return shown
+
+
+def recorded_verdicts(events):
+    name, recorded = None, []
+    for event in events:
+        if event["event"] == "diagnosticBegan":
+            name = event["name"]
+        elif event["event"] == "diagnosticEnded":
+            recorded.append((name, event["verdict"]))
+    return recorded
+
+
+class Killed:
+    """A run of the program that was killed, and what it left in the directory. `wait` returns when it is to be."""
+
+    def __init__(self, directory, wait):
+        self.record = directory / "record.jsonl"
+        environment = environment_with_marker(XDG_STATE_HOME=str(directory))
+        command = [PROGRAM, "run", *NAMES, "--record", str(self.record), "--log-level", "debug", "--set",
+                   f"count={COUNT}"]
+        for plugin in ("misbehaving", "well_behaved"):
+            command += ["--plugin", str(PLUGINS / f"{plugin}.so")]
+        with open(directory / "out", "wb") as out, open(directory / "err", "wb") as err:
+            process = subprocess.Popen(command, stdin=subprocess.DEVNULL, stdout=out, stderr=err, env=environment)
+            wait()
+            self.had_children = len(processes_in(environment)) > 1
+            process.send_signal(signal.SIGKILL)
+            self.code = process.wait()
+        limit = time.monotonic() + LONGEST_DEATH
+        self.left = processes_in(environment)
+        while self.left and time.monotonic() < limit:
+            time.sleep(0.01)
+            self.left = processes_in(environment)
+        end_processes(self.left)
+        self.verdicts = shown_verdicts(whole_lines(directory / "out"))
+        found = [LOG_LINE.fullmatch(line) for line in whole_lines(directory / "err")]
+        self.log = [(match[1], match[2]) for match in found if match]
+        self.events = [json.loads(line) for line in whole_lines(self.record)]
+
+    @property
+    def moment(self):
+        """What the program was doing, by the record's last whole line."""
+        if not self.events:
+            return "before the first event"
+        last = self.events[-1]["event"]
+        if last in ("runBegan", "diagnosticEnded"):
+            return "between two"
+        return {"log": "while logging", "measured": "while measuring", "found": "while finding"}.get(last, "elsewhere")
+
+
+class KilledHostTest(unittest.TestCase):
+    def test_what_was_seen_is_in_the_record_and_nothing_is_left(self):
+        chance = random.Random(SEED)
+        longest = self.length_of_run()
+        tally = collections.Counter()
+        for number in range(KILLS):
+            # The first tenth of a run, in which the plug-ins are loaded, has its own part of the kills.
+            seconds = chance.uniform(0, longest * (0.1 if number % 10 == 0 else 1.05))
+            with self.subTest(number=number, seconds=seconds), tempfile.TemporaryDirectory() as directory:
+                killed = Killed(pathlib.Path(directory), functools.partial(time.sleep, seconds))
+                self.check(killed)
+                tally[killed.moment] += 1
+                tally["(with a child)"] += killed.had_children
+                tally["(verdicts seen)"] += len(killed.verdicts)
+                tally["(log lines seen)"] += len(killed.log)
+        print(f"{KILLS} kills within {longest:.2f} s: " + ", ".join(f"{n} {what}" for what, n in sorted(tally.items())))
+        self.assertGreater(tally["(with a child)"], KILLS / 3)
+        self.assertGreater(tally["(verdicts seen)"], KILLS)
+        self.assertGreater(tally["(log lines seen)"], KILLS)
+
+    def length_of_run(self):
+        """The seconds until the one that never ends runs."""
+        with tempfile.TemporaryDirectory() as directory:
+            record = pathlib.Path(directory) / "record.jsonl"
+            begin = time.monotonic()
+
+            def wait():
+                while f'"diagnosticBegan","name":"{NAMES[-1]}"' not in "".join(whole_lines(record)):
+                    self.assertLess(time.monotonic() - begin, 60, "the run does not come to its last diagnostic")
+                    time.sleep(0.1)
+
+            self.check(Killed(pathlib.Path(directory), wait))
+            return time.monotonic() - begin
+
+    def check(self, killed):
+        self.assertEqual(killed.code, -signal.SIGKILL)
+        self.assertEqual(killed.left, [], "processes are left")
+        self.assertEqual(killed.verdicts, recorded_verdicts(killed.events)[:len(killed.verdicts)])
+        logged = [one for one in killed.events if one["event"] == "log" and isinstance(one["text"], str)]
+        recorded = collections.Counter((one["level"], one["text"]) for one in logged)
+        seen = collections.Counter((level, text) for level, text in killed.log if text.isprintable())
+        self.assertEqual(seen - recorded, collections.Counter(), "lines were seen that are not in the record")
+        if not killed.events:  # it was killed before it could have shown anything
+            self.assertEqual((killed.verdicts, killed.log), ([], []))
+            return
+        done = subprocess.run([PROGRAM, "verify", str(killed.record)], stdout=subprocess.PIPE,
+                              stderr=subprocess.STDOUT, encoding="utf-8", check=False)
+        self.assertEqual(done.returncode, 0, done.stdout)
+        self.assertIn(f"{len(killed.events)} event", done.stdout)
+        self.assertIn(" 0 problems\nThe run did not come to its end", done.stdout)
+
+
+if __name__ == "__main__":
+    PLUGINS, PROGRAM = pathlib.Path(sys.argv.pop()), sys.argv.pop()
+    unittest.main()

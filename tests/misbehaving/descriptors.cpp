@@ -1,0 +1,67 @@
+// Diagnostics that use descriptors that are not theirs.
+#include "tests/misbehaving/misbehaviour.h"
+
+#include <sys/syscall.h>
+#include <unistd.h>
+
+#include <algorithm>
+#include <cstddef>
+#include <string>
+#include <string_view>
+
+namespace quazor::misbehaving {
+
+namespace {
+
+constexpr int kMostDescriptors = 1024;
+constexpr int kFirstAfterStreams = 3;  // after the standard streams
+constexpr std::size_t kFlood = 100'000'000;
+
+void writeAll(int descriptor, std::string_view text) {
+  while (!text.empty()) {
+    const ssize_t written = ::write(descriptor, text.data(), text.size());
+    if (written < 0) return;
+    text.remove_prefix(static_cast<std::size_t>(written));
+  }
+}
+
+void closeFrom(int first) { ::syscall(SYS_close_range, first, ~0U, 0); }
+
+void writeToAll(int first, std::string_view text) {
+  for (int descriptor = first; descriptor < kMostDescriptors; ++descriptor) writeAll(descriptor, text);
+}
+
+// Every octet, with and without an end of a line.
+void writeGarbageToOutput() {
+  std::string octets;
+  for (int i = 0; i < 256; ++i) octets += static_cast<char>(i);
+  writeAll(STDOUT_FILENO, octets);
+  writeAll(STDERR_FILENO, "\xFF\xFE\nhalf a line");
+}
+
+void floodOutput(std::string_view line) {
+  std::string lines;
+  while (lines.size() < kFlood / 100) lines += line;
+  for (int i = 0; i < 100; ++i) writeAll(STDOUT_FILENO, lines);
+}
+
+}  // namespace
+
+void addDescriptors() {
+  addDiagnostic("CloseEverything", {.inRun = [] { closeFrom(0); }});
+  addDiagnostic("CloseConnection", {.inRun = [] { closeFrom(kFirstAfterStreams); }});
+  addDiagnostic("CloseConnectionAndHang", {.inRun = [] {
+                  closeFrom(kFirstAfterStreams);
+                  sleepForEver();
+                }});
+  addDiagnostic("GarbageEverywhere", {.inRun = [] { writeToAll(0, "\xFF garbage {\n"); }});
+  addDiagnostic("HalfALineEverywhere", {.inRun = [] { writeToAll(kFirstAfterStreams, "{\"event\":"); }});
+  addDiagnostic("ForeignEventEverywhere", {.inRun = [] {
+                  writeToAll(kFirstAfterStreams, "{\"event\":\"runEnded\",\"date\":\"2026-11-21T01:08:00.000000Z\"}\n");
+                }});
+  addDiagnostic("GarbageToOutput", {.inRun = writeGarbageToOutput});
+  addDiagnostic("FloodOfLines", {.inRun = [] { floodOutput("as many lines as this are of no use to anybody\n"); }});
+  addDiagnostic("FloodWithoutLines", {.inRun = [] { floodOutput("0123456789"); }});
+}
+
+}  // namespace quazor::misbehaving

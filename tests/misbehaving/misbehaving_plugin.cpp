@@ -1,0 +1,17 @@
+// A plug-in whose diagnostics misbehave when they run.
+#include "tests/misbehaving/misbehaviour.h"
+
+namespace quazor::misbehaving {
+
+namespace {
+
+[[gnu::constructor]] void registerAll() {
+  addEndings();
+  addDescriptors();
+  addProcesses();
+  addResults();
+}
+
+}  // namespace
+
+}  // namespace quazor::misbehaving

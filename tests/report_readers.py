@@ -1,0 +1,402 @@
+"""Reads the records of a run back from the forms of its report, each with a parser of its own.
+
+What a form can say of a record is a dictionary; `expected_of_FORM` makes it from that of the JSON document.
+"""
+
+import collections
+import csv
+import io
+import json
+import math
+import re
+
+VERDICTS = {("COMPLETE", "PASS"): "pass", ("COMPLETE", "FAIL"): "fail", ("ERROR", "NOT_APPLICABLE"): "error"}
+CSV_HEADER = ("diagnostic,verdict,result,value,unit,limit,lower,lowerOpen,upper,upperOpen,resultVerdict,"
+              "errorStage,errorDomain,errorCode,errorMessage").split(",")
+
+Result = collections.namedtuple("Result", "name value unit limit verdict")
+Limit = collections.namedtuple("Limit", "name lower upper")  # bounds are (value, open)
+Error = collections.namedtuple("Error", "domain code message")
+NO_LIMIT = Limit("", None, None)
+
+
+def number(text):
+    """A number as something that compares, whatever its form: NaN equals itself, and zeros keep their sign."""
+    return repr(float(text))
+
+
+def printable(text):
+    """As people are shown it: a control character is \\xNN."""
+    return re.sub("[\x00-\x1f\x7f-\x9f]", lambda found: f"\\x{ord(found[0]):02x}", text)
+
+
+def in_xml(text):
+    """As XML 1.0 can hold it."""
+    return re.sub("[\x00-\x08\x0b\x0c\x0e-\x1f\ufffe\uffff]", "\ufffd", text)
+
+
+def errors_of(error):
+    """An error of the JSON document and those that caused it, the nearest first."""
+    errors = []
+    while error is not None:
+        errors.append(Error(error["domain"], error["code"], error["message"]))
+        error = error.get("underlying-error")
+    return errors
+
+
+# --- JSON: what the others are compared with ---
+
+
+def limit_of(limit):
+    def bound(one):
+        return None if one is None else (number(one["value"]), one["open"])
+
+    return None if limit is None else Limit(limit["name"], bound(limit["lower"]), bound(limit["upper"]))
+
+
+def read_json(text):
+    document = json.loads(text)
+    of_experiments = "experiments" in document
+    records = []
+    for one in document["experiments" if of_experiments else "diagnostics"]:
+        parameters = {"experiment": one["parameters"], "analysis": {}} if of_experiments else one["parameters"]
+        records.append({
+            "name": one["name"],
+            "summary": one["summary"],
+            "verdict": one["verdict"],
+            "results": [
+                Result(each["name"], number(each["value"]), each["unit"], limit_of(each["limit"]), each["verdict"])
+                for each in one.get("measuredResults", [])],
+            "measurements": [
+                (name, number(each["value"]), each["unit"]) for name, each in one["measurements"].items()],
+            "errors": errors_of(one["error"]),
+            "log": [(line["level"], line["text"]) for line in one["log"]],
+            "parameters": {half: {name: number(value) for name, value in values.items()}
+                           for half, values in parameters.items()},
+            "seed": one["seed"],
+            "auxiliaryData": one["auxiliaryData"],
+            "faults": one["faults"],
+        })
+    return of_experiments, records, document.get("interrupted")
+
+
+# --- Open Compute Test & Validation ---
+
+
+def split_symptom(error):
+    domain, _, code = error["symptom"].rpartition(":")
+    return Error(domain, int(code), error["message"])
+
+
+def ocp_limit(measurement):
+    if "validators" in measurement:
+        bounds = {}
+        for one in measurement["validators"]:
+            which = "lower" if one["type"].startswith("GREATER") else "upper"
+            bounds[which] = (number(one["value"]), not one["type"].endswith("OR_EQUAL"))
+            name = one["name"]
+        return Limit(name, bounds.get("lower"), bounds.get("upper"))
+    limit = measurement.get("metadata", {}).get("limit")
+    if limit is None:
+        return None
+    bounds = {which: (number(limit[which]["value"]), limit[which]["open"]) for which in ("lower", "upper")
+              if which in limit}
+    return Limit(limit["name"], bounds.get("lower"), bounds.get("upper"))
+
+
+def ocp_results(stream):
+    """The results of the analysis, whose diagnoses stand behind their measurements."""
+    results = []
+    for one in stream.of_step("analysis"):
+        if "measurement" in one:
+            it = one["measurement"]
+            results.append(Result(it["name"], number(it["value"]), it.get("unit", ""), ocp_limit(it), "none"))
+        if "diagnosis" in one:
+            kind = one["diagnosis"]["type"].lower()
+            if one["diagnosis"]["verdict"] != f"{results[-1].name}-{kind}":
+                raise ValueError(f"diagnosis {one['diagnosis']} of {results[-1]}")
+            results[-1] = results[-1]._replace(verdict=kind)
+    return results
+
+
+def read_ocp(stream):
+    """A test run as a record."""
+    levels = {"ERROR": "error", "INFO": "default", "DEBUG": "debug"}
+    raw = [one["measurement"] for one in stream.of_step("experiment") if "measurement" in one]
+    extensions = {one["extension"]["name"]: one["extension"]["content"]
+                  for one in stream.of_step("experiment") if "extension" in one}
+    if not all(one["name"].startswith("raw.") for one in raw):
+        raise ValueError("a measurement of the experiment that is not marked as raw")
+    parameters = stream.start["parameters"]
+    record = {
+        "name": stream.start["name"],
+        "summary": stream.start["metadata"].get("summary", ""),
+        "verdict": VERDICTS.get((stream.end["status"], stream.end["result"])),
+        "results": ocp_results(stream),
+        "measurements": [(one["name"][len("raw."):], number(one["value"]), one.get("unit", "")) for one in raw],
+        "errors": [split_symptom(one) for one in stream.all_of("error")],
+        "log": [(levels[one["severity"]], one["message"]) for one in stream.all_of("log")],
+        "parameters": {half: {name: number(value) for name, value in parameters.get(half, {}).items()}
+                       for half in ("experiment", "analysis")},
+        "seed": stream.start["metadata"]["seed"],
+        "auxiliaryData": extensions.get("auxiliaryData", {}),
+    }
+    if stream.of_step("experiment"):
+        record["faults"] = [one["fault"] | {"fired": one["fired"]}
+                            for one in extensions.get("faults", {}).get("faults", [])]
+    return record
+
+
+def expected_of_ocp(record):
+    """With an error, nothing is known of the hardware."""
+    if record["verdict"] != "error":
+        return record
+    unknown = [one if one.verdict == "none" else one._replace(verdict="unknown") for one in record["results"]]
+    return record | {"results": unknown}
+
+
+# --- JUnit ---
+
+
+def properties_of(element):
+    found = [(one.get("name"), one.get("value")) for one in element.findall("properties/property")]
+    return dict(found)
+
+
+def derived_verdict(suite):
+    """What a server of continuous integration makes of a suite."""
+    counts = {key: int(suite.get(key)) for key in ("tests", "failures", "errors", "skipped")}
+    cases = suite.findall("testcase")
+    real = {"tests": len(cases), "failures": sum(one.find("failure") is not None for one in cases),
+            "errors": sum(one.find("error") is not None for one in cases),
+            "skipped": sum(one.find("skipped") is not None for one in cases)}
+    if counts != real:
+        raise ValueError(f"counts {counts} where there are {real}")
+    if counts["errors"]:
+        return "error"
+    if counts["failures"]:
+        return "fail"
+    return "pass" if counts["tests"] > counts["skipped"] else None
+
+
+def junit_result(case, verdict_of_suite):
+    it = properties_of(case)
+
+    def bound(which):
+        return (number(it[which]), {"true": True, "false": False}[it[which + "Open"]]) if which in it else None
+
+    limit = Limit(it["limit"], bound("lower"), bound("upper")) if "limit" in it else None
+    result = Result(case.get("name"), number(it["value"]), it["unit"], limit, it["verdict"])
+    allowed = {"pass": [[]], "none": [[]], "fail": [["failure"], ["error"]]}[result.verdict]
+    if result.verdict == "fail" and not all(math.isfinite(float(it[key])) for key in ("value", "lower", "upper")
+                                            if key in it):
+        allowed = [["error"]]  # it cannot be judged
+    found = [one.tag for one in case if one.tag != "properties"]
+    if found not in allowed or (found == ["error"] and verdict_of_suite != "error"):
+        raise ValueError(f"{result} with {found}")
+    return result
+
+
+def junit_log(suite):
+    text = suite.findtext("system-out") or ""
+    lines = [line.split(" ", 2) for line in text.split("\n")[:-1]]
+    return [(level, message) for _, level, message in lines]
+
+
+def read_junit(suite):
+    it = properties_of(suite)
+    cases = suite.findall("testcase")
+    errors = [one for one in cases if one.find("error") is not None and "value" not in properties_of(one)]
+    measured = next((properties_of(one) for one in cases if one.get("name") == "result"), {})
+    values = {key[len("measurement."):]: value.split(" ", 1)
+              for key, value in measured.items() if key.startswith("measurement.")}
+    record = {
+        "name": suite.get("name"),
+        "summary": it["summary"],
+        "verdict": it["verdict"],
+        "results": [junit_result(one, it["verdict"]) for one in cases if "value" in properties_of(one)],
+        "parameters": {half: {key[len(f"parameter.{half}."):]: number(value) for key, value in it.items()
+                              if key.startswith(f"parameter.{half}.")} for half in ("experiment", "analysis")},
+        "seed": int(it["seed"]),
+        "log": junit_log(suite),
+        "junit errors": [],
+    }
+    if values:
+        record["measurements"] = [(name, number(value), unit) for name, (value, unit) in values.items()]
+    if [f"source.{half}.{name}" in it for half, all_of in record["parameters"].items() for name in all_of].count(False):
+        raise ValueError("a parameter without its source")
+    if derived_verdict(suite) != it["verdict"]:
+        raise ValueError(f"it says {it['verdict']}, and its test cases {derived_verdict(suite)}")
+    if len(errors) != (it["verdict"] == "error"):
+        raise ValueError(f"{len(errors)} errors of the run")
+    for one in errors:
+        error = one.find("error")
+        record["junit errors"] = [error.get("type"), error.get("message"), error.text]
+        record["error stage"] = one.get("name")
+    return record
+
+
+def error_lines(errors, indent):
+    """The errors as people are shown them."""
+    return [indent + ("caused by " if place else "") + printable(f"{one.domain} code {one.code}: {one.message}")
+            for place, one in enumerate(errors)]
+
+
+def expected_of_junit(record):
+    errors = record["errors"]
+    lines = "".join(line + "\n" for line in error_lines(errors, ""))
+    return {
+        "name": in_xml(record["name"]),
+        "summary": in_xml(record["summary"]),
+        "verdict": record["verdict"],
+        "results": [one._replace(name=in_xml(one.name), unit=in_xml(one.unit),
+                                 limit=one.limit and one.limit._replace(name=in_xml(one.limit.name)))
+                    for one in record["results"]],
+        "measurements": [(in_xml(name), value, in_xml(unit)) for name, value, unit in record["measurements"]],
+        "parameters": {half: {in_xml(name): value for name, value in values.items()}
+                       for half, values in record["parameters"].items()},
+        "seed": record["seed"],
+        "log": [(level, in_xml(printable(text))) for level, text in record["log"]],
+        "junit errors": errors and [in_xml(f"{errors[0].domain}:{errors[0].code}"), in_xml(errors[0].message),
+                                    in_xml(lines)],
+    }
+
+
+# --- CSV ---
+
+
+def csv_rows(content):
+    return list(csv.reader(io.StringIO(content.decode("utf-8", "replace"), newline="")))
+
+
+def read_csv(rows):
+    """A diagnostic's lines as a record."""
+    if any(row[:2] != rows[0][:2] or row[11:] != rows[0][11:] for row in rows):
+        raise ValueError("lines of one diagnostic differ in what they say of it")
+    first = dict(zip(CSV_HEADER, rows[0]))
+    results = []
+    for row in rows:
+        it = dict(zip(CSV_HEADER, row))
+        if it["value"] == "":
+            continue
+        flags = {"1": True, "0": False}
+        bounds = [(number(it[which]), flags[it[which + "Open"]]) if it[which] else None for which in ("lower", "upper")]
+        results.append(Result(it["result"], number(it["value"]), it["unit"], Limit(it["limit"], *bounds),
+                              it["resultVerdict"]))
+    errors = [Error(first["errorDomain"], int(first["errorCode"]), first["errorMessage"])] if first["errorCode"] else []
+    return {"name": first["diagnostic"], "verdict": first["verdict"], "results": results, "errors": errors,
+            "error stage": first["errorStage"] or "judge"}
+
+
+def expected_of_csv(record):
+    """No limit looks like one without name and bounds, and there is room for one error."""
+    results = [one._replace(limit=one.limit or NO_LIMIT) for one in record["results"]]
+    return {"name": record["name"], "verdict": record["verdict"], "results": results, "errors": record["errors"][:1]}
+
+
+def read_experiment_csv(rows):
+    """The measurements of all experiments."""
+    columns = {name: rows[0].index(name) for name in ("experiment", "measurement", "value", "unit") if name in rows[0]}
+    if len(columns) < 4:
+        return []
+    cells = [[row[columns[name]] for name in ("experiment", "measurement", "value", "unit")] for row in rows[1:]]
+    return [(experiment, name, number(value), unit) for experiment, name, value, unit in cells if value]
+
+
+# --- The text ---
+
+
+def columns_of(line, begins):
+    """The cells of a line of a table, as bytes. Bytes that only continue a code point have no width; a blank stands
+    before every cell, so those at a cell's beginning are its own."""
+    begins_of_points = [at for at, byte in enumerate(line) if byte & 0xC0 != 0x80]
+    cuts = [begins_of_points[begin - 1] + 1 for begin in begins]
+    return [line[begin:end] for begin, end in zip(cuts, cuts[1:] + [len(line)])]
+
+
+def readable(cell):
+    return cell.decode("utf-8", "replace").rstrip(" ")
+
+
+def table_of(lines):
+    """The rows of a table whose second column is a number on the right."""
+    header = lines[0].decode()
+    begins = [header.index(word) for word in ("Unit", "Limit", "Verdict") if word in header]
+    rows = []
+    for line in lines[1:]:
+        first, *others = columns_of(line, [2, *begins])
+        name, _, value = first.rstrip(b" ").rpartition(b" ")
+        rows.append([readable(name), number(value.decode()), *map(readable, others)])
+    return rows
+
+
+def text_limit(text):
+    """The limit of such a text, and its name."""
+    if text == "-":
+        return None
+    one = r"(-?[0-9.e+-]+|-?inf|nan)"
+    found = re.fullmatch(f"(?s)(.*): (?:no bounds|= {one}|(?:(>=?) {one})?(?:, )?(?:(<=?) {one})?)", text)
+    name, exact, above, low, below, high = found.groups()
+    if exact is not None:
+        return Limit(name, (number(exact), False), (number(exact), False))
+    return Limit(name, above and (number(low), above == ">"), below and (number(high), below == "<"))
+
+
+class Lines:
+    """The lines of a text, read one after the other."""
+
+    def __init__(self, content):
+        self.lines = content.split(b"\n")
+        self.at = 0
+
+    def next(self):
+        self.at += 1
+        return self.lines[self.at - 1]
+
+    def block(self):
+        """The lines up to an empty one, which is passed."""
+        begin = self.at
+        while self.next():
+            pass
+        return self.lines[begin:self.at - 1]
+
+    def rest(self):
+        return self.lines[self.at:]
+
+
+def read_text(lines, expected):
+    """The next record of a text."""
+    record = {"name": lines.next().decode("utf-8", "replace")}
+    record["summary"] = [line.decode("utf-8", "replace") for line in lines.block()]
+    record["results"], record["measurements"] = [], []
+    if expected["results"]:
+        record["results"] = [Result(name, value, unit, text_limit(limit), verdict.replace("-", "none"))
+                             for name, value, unit, limit, verdict in table_of(lines.block())]
+    if expected["measurements"]:
+        record["measurements"] = [tuple(row) for row in table_of(lines.block())]
+    if expected["auxiliaryData"]:
+        lines.block()
+    verdict, *errors = lines.block()
+    record["verdict"] = {b"PASS": "pass", b"DONE": "pass", b"FAIL": "fail", b"ERROR": "error"}[verdict[2:]]
+    record["errors"] = [line.decode("utf-8", "replace") for line in errors]
+    return record
+
+
+def expected_of_text(record, of_experiments):
+    def shown(text):
+        return printable(text).rstrip(" ")
+
+    def of_limit(limit):
+        return limit and limit._replace(name=printable(limit.name))
+
+    return {
+        "name": printable(record["name"]),
+        "summary": ["  " + printable(line) for line in record["summary"].split("\n")],
+        "results": [one._replace(name=shown(one.name), unit=shown(one.unit), limit=of_limit(one.limit))
+                    for one in record["results"]],
+        "measurements": [(shown(name), value, shown(unit)) for name, value, unit in record["measurements"]]
+        if of_experiments else [],
+        "auxiliaryData": of_experiments and record["auxiliaryData"],
+        "verdict": record["verdict"],
+        "errors": error_lines(record["errors"], "    "),
+    }

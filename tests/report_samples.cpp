@@ -1,0 +1,339 @@
+// Makes random runs and writes each of them in every form of report, for a reader to compare.
+//
+//   report_samples DIRECTORY COUNT SEED
+//
+// The directory gets a file for each format, with its name. In it each run is a line with the number of its bytes, and
+// then the report.
+#include "host/host_error.h"
+#include "host/report_format.h"
+#include "host/verdict_of_record.h"
+
+#include <algorithm>
+#include <cstdint>
+#include <cstdlib>
+#include <filesystem>
+#include <fstream>
+#include <iostream>
+#include <iterator>
+#include <limits>
+#include <random>
+
+namespace quazor {
+namespace {
+
+constexpr std::string_view kFragments[] = {"frames",
+                                           "Back Wide",
+                                           "a",
+                                           "x.y",
+                                           "\"quoted\"",
+                                           "it's",
+                                           "a,b",
+                                           ";",
+                                           "\n",
+                                           "\r",
+                                           "\r\n",
+                                           "\t",
+                                           "\n\n",
+                                           "]]>",
+                                           "<tag attr=\"1\">",
+                                           "</testsuite>",
+                                           "&amp;&#0;&",
+                                           "<![CDATA[",
+                                           "<!--",
+                                           "-->",
+                                           "\\",
+                                           "\\n",
+                                           "\\x00",
+                                           "{}",
+                                           "%@ %s",
+                                           "  ",
+                                           " code -1: ",
+                                           "caused by ",
+                                           ": >= 1",
+                                           "- ",
+                                           "PASS",
+                                           "null",
+                                           "NaN",
+                                           "=1+1",
+                                           "\x01",
+                                           "\x1B[31m",
+                                           "\x7F",
+                                           "\xC2\x85",
+                                           "\xC2\x9B",
+                                           "\xC2\xA0",
+                                           "\xE2\x80\xA8",
+                                           "\xE2\x80\xAE",
+                                           "\xC3\xA9",
+                                           "\xE2\x82\xAC",
+                                           "\xF0\x9F\x93\xB7",
+                                           "\xEF\xBB\xBF",
+                                           "\xEF\xBF\xBE",
+                                           "\xEF\xBF\xBF",
+                                           "\xEF\xBF\xBD",
+                                           "\xF4\x8F\xBF\xBF",
+                                           "\xFF",
+                                           "\x80",
+                                           "\xC3",
+                                           "\xE2\x82",
+                                           "\xF0\x9F\x93",
+                                           "\xC0\xAF",
+                                           "\xE0\x80\x80",
+                                           "\xED\xA0\x80",
+                                           "\xF4\x90\x80\x80",
+                                           "\xF0\x8F\xBF\xBF",
+                                           "\xC2\xC2\x80",
+                                           std::string_view("\0", 1)};
+
+constexpr double kNumbers[] = {0,
+                               -0.0,
+                               1,
+                               -1,
+                               0.1,
+                               89,
+                               90,
+                               1.0 / 3,
+                               1e15,
+                               1e16,
+                               9007199254740993.0,
+                               1e21,
+                               1e-7,
+                               -123456.789,
+                               std::numeric_limits<double>::max(),
+                               std::numeric_limits<double>::lowest(),
+                               std::numeric_limits<double>::min(),
+                               std::numeric_limits<double>::denorm_min()};
+
+constexpr double kNotFinite[] = {std::numeric_limits<double>::quiet_NaN(), std::numeric_limits<double>::infinity(),
+                                 -std::numeric_limits<double>::infinity()};
+
+struct Sample {
+  RunBegan run;
+  std::vector<DiagnosticRecord> records;
+  std::optional<std::string> interrupted;
+};
+
+class Generator {
+ public:
+  explicit Generator(std::uint64_t seed) : random_(seed) {}
+
+  Sample sample() {
+    Sample sample;
+    sample.run.program = "0.1.0";
+    sample.run.contract = 1;
+    sample.run.date = advance();
+    sample.run.phone = text();
+    for (std::size_t i = upTo(2); i > 0; --i) sample.run.plugins.push_back(text());
+    sample.run.seed = random_();
+    sample.run.ofExperiments = oneIn(4);
+    for (std::size_t i = upTo(4); i > 0; --i) {
+      sample.records.push_back(sample.run.ofExperiments ? experiment() : diagnostic());
+      sample.run.names.push_back(sample.records.back().name);
+    }
+    if (oneIn(5)) interrupt(sample);
+    return sample;
+  }
+
+ private:
+  // 0 to `most`.
+  std::size_t upTo(std::size_t most) { return static_cast<std::size_t>(random_() % (most + 1)); }
+  bool oneIn(std::size_t count) { return upTo(count - 1) == 0; }
+  template <class T, std::size_t size>
+  T oneOf(const T (&choices)[size]) {
+    return choices[upTo(size - 1)];
+  }
+
+  std::string text() {
+    std::string text;
+    for (std::size_t i = oneIn(200) ? 300 : upTo(4); i > 0; --i) text += oneOf(kFragments);
+    return text;
+  }
+
+  // Some time later; or right now, as the wall clock may be coarse.
+  Date advance() { return now_ += std::chrono::nanoseconds(oneIn(4) ? 0 : upTo(2'000'000'000)); }
+  // Somewhat before now: log lines of several threads, and a clock that was set back.
+  Date around() { return now_ - std::chrono::nanoseconds(oneIn(4) ? upTo(3'000'000'000) : 0); }
+
+  double number() { return oneIn(3) ? static_cast<double>(upTo(1000)) / 8 : oneOf(kNumbers); }
+  const QZUnit& unit() {
+    if (oneIn(2)) return QZDimensionlessUnit::frames();
+    return oneIn(3) ? QZUnit::unitWithSymbol("") : QZUnit::unitWithSymbol(text());
+  }
+
+  DiagnosticErrorPtr error() {
+    DiagnosticErrorPtr error;
+    for (std::size_t i = oneIn(20) ? 60 : 1 + upTo(2); i > 0; --i) {
+      const std::int64_t code =
+          oneIn(4) ? std::numeric_limits<std::int64_t>::min() : static_cast<std::int64_t>(upTo(9));
+      error = oneIn(8) ? std::make_shared<const DiagnosticError>(text(), code, Dictionary())
+                       : errorWithMessage(text(), code, text(), error);
+    }
+    return error;
+  }
+
+  std::vector<BoundParameter> parameters() {
+    std::vector<BoundParameter> parameters;
+    for (std::size_t i = upTo(3); i > 0; --i) {
+      std::optional<Value> value;
+      if (!oneIn(3)) value = oneIn(2) ? Value(number()) : Value(static_cast<std::int64_t>(random_()));
+      parameters.push_back({distinct(i), QZNumberParameter(text(), oneIn(2)), value, value ? text() : std::string()});
+    }
+    return parameters;
+  }
+
+  // Not the same as that of another number, whatever a report makes of the bytes.
+  std::string distinct(std::size_t number) { return std::to_string(number) + text(); }
+
+  std::shared_ptr<const QZBound> bound(double value, const QZUnit& unit, bool open) {
+    return std::make_shared<const QZBound>(Measurement(value, unit), open);
+  }
+
+  // A result that passes, fails, is for information or, if `wild`, cannot be judged.
+  QZMeasuredResult result(bool wild, bool mayFail) {
+    const QZUnit& ofValue = unit();
+    const double value = wild && oneIn(3) ? oneOf(kNotFinite) : number();
+    QZMeasuredResult result(text(), Measurement(value, ofValue));
+    if (oneIn(4)) return result;
+    QZLimit limit(text());
+    const QZUnit& ofBound = wild && oneIn(3) ? unit() : ofValue;
+    const auto near = [&](double step) { return wild && oneIn(4) ? oneOf(kNotFinite) : value + step * 16; };
+    const double shift = mayFail && oneIn(3) ? 2 : 0;
+    if (!oneIn(3)) limit.setLowerBound(bound(near(shift - 1), ofBound, oneIn(2)));
+    if (!oneIn(3)) limit.setUpperBound(bound(near(shift + 1), ofBound, oneIn(2)));
+    if (oneIn(6)) {
+      const auto exact = bound(value, ofValue, false);
+      limit.setLowerBound(exact);
+      limit.setUpperBound(exact);
+    }
+    result.setLimit(std::move(limit));
+    return result;
+  }
+
+  void addStage(DiagnosticRecord& record, Stage stage, bool ends = true) {
+    record.stages.push_back({stage, advance(), std::nullopt});
+    for (std::size_t i = upTo(2); i > 0; --i) {
+      constexpr LogLevel kLevels[] = {LogLevel::kError, LogLevel::kDefault, LogLevel::kDebug};
+      advance();
+      record.log.push_back({std::chrono::nanoseconds(upTo(1'000'000'000)), oneOf(kLevels), text(), around()});
+    }
+    if (ends) record.stages.back().end = advance();
+  }
+
+  // Goes through the stages up to one that fails, if one does. True when the analysis is to follow.
+  bool goThrough(DiagnosticRecord& record) {
+    std::optional<Stage> failing;
+    if (oneIn(3)) failing = oneOf(kStages);
+    const auto go = [&](Stage stage) {
+      const bool fails = failing == stage && record.error == nullptr;
+      addStage(record, stage, !fails || !oneIn(4));
+      if (!fails) return true;
+      record.error = oneIn(6) ? hostError(HostErrorCode::kCrashed, "the plug-in's process ended") : error();
+      record.errorStage = stage;
+      return false;
+    };
+    if (failing == Stage::kLoad) return go(Stage::kLoad);
+    if (!go(Stage::kDescribe) || !go(Stage::kSetup)) return false;
+    const bool ran = go(Stage::kRun);
+    if (ran) addMeasurements(record);
+    if (oneIn(2) || failing == Stage::kTeardown) go(Stage::kTeardown);
+    return ran && !record.experimentOnly && go(Stage::kAnalyse);
+  }
+
+  void addMeasurements(DiagnosticRecord& record) {
+    for (std::size_t i = upTo(5); i > 0; --i) {
+      const double value = oneIn(8) ? oneOf(kNotFinite) : number();
+      record.measurements.set(distinct(i), Measurement(value, unit()));
+    }
+    if (oneIn(3)) record.auxiliaryData.set(text(), text());
+    if (oneIn(5)) record.auxiliaryData.set("numbers", Array{oneOf(kNotFinite), number(), 36.6F, Bytes{0xA5}});
+  }
+
+  DiagnosticRecord begun() {
+    DiagnosticRecord record;
+    record.name = text();
+    record.summary = text();
+    record.experimentName = text();
+    record.parameters.experiment = parameters();
+    record.seed = random_();
+    record.begin = advance();
+    if (oneIn(4)) record.faults.push_back({{{"operation", text()}}, upTo(3)});
+    return record;
+  }
+
+  DiagnosticRecord experiment() {
+    DiagnosticRecord record = begun();
+    record.experimentOnly = true;
+    goThrough(record);
+    return ended(std::move(record));
+  }
+
+  DiagnosticRecord diagnostic() {
+    DiagnosticRecord record = begun();
+    record.analysisName = text();
+    record.parameters.analysis = parameters();
+    if (goThrough(record)) {
+      const bool wild = oneIn(6);
+      const bool mayFail = oneIn(3);
+      for (std::size_t i = oneIn(40) ? 300 : upTo(6); i > 0; --i) {
+        QZMeasuredResult one = result(wild, mayFail);
+        const ResultVerdict verdict = judgeResult(one).verdict;
+        record.measuredResults.push_back({std::move(one), verdict});
+      }
+    }
+    return ended(std::move(record));
+  }
+
+  DiagnosticRecord ended(DiagnosticRecord record) {
+    const RecordJudgement judgement = judgeRecord(record, !oneIn(30));
+    record.verdict = judgement.verdict;
+    record.error = judgement.error;
+    advance();
+    record.end = around();
+    return record;
+  }
+
+  void interrupt(Sample& sample) {
+    sample.interrupted = oneIn(2) ? std::string() : text();
+    if (!sample.interrupted->empty()) sample.run.names.push_back(*sample.interrupted);
+    for (std::size_t i = upTo(2); i > 0; --i) sample.run.names.push_back(text());
+    if (!oneIn(3)) return;
+    // It was asked to end, and there is a record of it.
+    DiagnosticRecord record = begun();
+    record.experimentOnly = sample.run.ofExperiments;
+    addStage(record, Stage::kRun, false);
+    record.error = hostError(HostErrorCode::kInterrupted, "it was interrupted");
+    record.errorStage = Stage::kRun;
+    if (!sample.interrupted->empty()) record.name = *sample.interrupted;
+    sample.interrupted = record.name;
+    sample.records.push_back(ended(std::move(record)));
+  }
+
+  std::mt19937_64 random_;
+  Date now_{std::chrono::seconds(1'795'220'000)};
+};
+
+bool writeSamples(const std::filesystem::path& directory, std::size_t count, std::uint64_t seed) {
+  std::vector<std::ofstream> files;
+  for (const Format format : kFormats) files.emplace_back(directory / nameOf(format), std::ios::binary);
+  Generator generator(seed);
+  for (std::size_t i = 0; i < count; ++i) {
+    const auto [run, records, interrupted] = generator.sample();
+    for (std::size_t at = 0; at < files.size(); ++at) {
+      const std::string report = reportText(kFormats[at], run, records, interrupted);
+      files[at] << report.size() << '\n' << report;
+    }
+  }
+  return std::all_of(files.begin(), files.end(), [](std::ofstream& file) { return static_cast<bool>(file.flush()); });
+}
+
+}  // namespace
+}  // namespace quazor
+
+int main(int argc, char** argv) {
+  if (argc != 4) {
+    std::cerr << "usage: report_samples DIRECTORY COUNT SEED\n";
+    return EXIT_FAILURE;
+  }
+  if (quazor::writeSamples(argv[1], std::stoull(argv[2]), std::stoull(argv[3]))) return EXIT_SUCCESS;
+  std::cerr << "cannot write to " << argv[1] << '\n';
+  return EXIT_FAILURE;
+}

@@ -1,0 +1,180 @@
+#!/usr/bin/env python3
+"""Reads random runs back from every form of report, each with a parser of its own, and compares what they say.
+
+usage: reports_agree.py REPORT_SAMPLES
+
+REPORT_SAMPLES is the program that makes the runs. The lines of Open Compute Test & Validation must also obey the rules
+of their format. With QUAZOR_THOROUGH=1 in the environment there are ten times as many runs. Exit code 0: all agree;
+1: something does not, or a kind of run was not among the samples.
+"""
+
+import collections
+import json
+import os
+import pathlib
+import subprocess
+import sys
+import tempfile
+import xml.etree.ElementTree
+
+import ocp_rules
+import report_readers
+from report_readers import in_xml
+
+COUNT = 1000
+SEED = 20261121
+SHOWN = 20
+FORMS = ("text", "json", "csv", "ocp", "junit")
+INTERRUPTION = report_readers.Error("QuazorHostErrorDomain", 11, "it was interrupted")
+SIGNS = ("]]>", "\ufffd", "\uffff", "\\u0000", "\\r", "\u2028", ",")  # as JSON has them
+# There must be some of each.
+KINDS = {"a diagnostic: pass", "a diagnostic: fail", "a diagnostic: error", "an experiment: pass",
+         "an experiment: error", "an interrupted run without a record", "an interrupted run with a record", "a run that never began",
+         "no results", "many results", "a deep error", "a value that is not finite", "a limit without bounds",
+         "a result: pass", "a result: fail", "a result: none", *(f"a text with {sign!r}" for sign in SIGNS)}
+
+
+def counts_line(records, of_experiments):
+    count = collections.Counter(one["verdict"] for one in records)
+    many = "" if len(records) == 1 else "s"
+    if of_experiments:
+        return f"{len(records)} experiment{many}: {count['pass']} returned a result, {count['error']} ended in an error"
+    return (f"{len(records)} diagnostic{many}: {count['pass']} passed, {count['fail']} failed, "
+            f"{count['error']} ended in an error")
+
+
+def text_end(records, of_experiments, interrupted):
+    """The lines behind the records of a text."""
+    if len(records) != 1 or interrupted is not None:
+        yield counts_line(records, of_experiments)
+    if interrupted:
+        yield f"Interrupted while {report_readers.printable(interrupted)} was running."
+
+
+class Comparison:
+    """What the forms of the reports say differently, and which kinds of runs there were."""
+
+    def __init__(self):
+        self.found = []
+        self.kinds = collections.Counter()
+
+    def check(self, where, got, expected):
+        if got != expected:
+            self.found.append(f"{where}: got {got!r:.600}, expected {expected!r:.600}")
+
+    def check_record(self, where, got, expected):
+        """`got` is compared as far as `expected` goes too."""
+        for key in got.keys() & expected.keys():
+            self.check(f"{where}: {key}", got[key], expected[key])
+
+    def check_counts(self, name, of_records, streams, root):
+        suites = root.findall("testsuite")
+        self.check(f"{name}: streams and suites", len(streams), len(suites))
+        self.check(f"{name}: fewer streams than records", len(streams) < of_records, False)
+        for key in ("tests", "failures", "errors", "skipped"):
+            self.check(f"{name} junit: {key}", int(root.get(key)), sum(int(suite.get(key)) for suite in suites))
+        difference = float(root.get("time")) - sum(float(suite.get("time")) for suite in suites)
+        self.check(f"{name} junit: time", abs(difference) <= 0.001 * len(suites), True)
+
+    def compare(self, name, reports):
+        """`reports` are the bytes of one run's, by format."""
+        of_experiments, records, interrupted = report_readers.read_json(reports["json"].decode("utf-8"))
+        self.count_kinds(of_experiments, records)
+        streams = ocp_rules.streams_of(reports["ocp"], f"{name} ocp", self.found)
+        root = xml.etree.ElementTree.fromstring(reports["junit"])
+        suites = root.findall("testsuite")
+        self.check_counts(name, len(records), streams, root)
+        for place, (record, stream, suite) in enumerate(zip(records, streams, suites)):
+            where = f"{name} {place}"
+            self.check_record(f"{where} ocp", report_readers.read_ocp(stream), report_readers.expected_of_ocp(record))
+            junit = report_readers.read_junit(suite)
+            self.check_record(f"{where} junit", junit, report_readers.expected_of_junit(record))
+            self.check(f"{where}: begin", suite.get("timestamp"), stream.begin)
+            record["error stage"] = junit.get("error stage", "judge")
+        self.check_unfinished(name, streams[len(records):], suites[len(records):], records, interrupted)
+        self.compare_csv(name, report_readers.csv_rows(reports["csv"]), of_experiments, records)
+        self.compare_text(name, report_readers.Lines(reports["text"]), of_experiments, records, interrupted)
+
+    def check_unfinished(self, name, streams, suites, records, interrupted):
+        self.check(f"{name}: unfinished", [one.get("name") for one in suites],
+                   [in_xml(one.start["name"]) for one in streams])
+        ends = [{"ERROR": "error", "SKIP": None}[one.end["status"]] for one in streams]
+        self.check(f"{name}: unfinished verdicts", [report_readers.derived_verdict(one) for one in suites], ends)
+        has_record = bool(records) and records[-1]["errors"][:1] == [INTERRUPTION]
+        expected = int(interrupted is not None and not has_record)
+        self.check(f"{name}: interrupted ones without a record", ends.count("error"), expected)
+        if expected:
+            self.check(f"{name}: interrupted", streams[0].start["name"], interrupted or "quazor")
+        if interrupted is None:
+            self.check(f"{name}: unfinished runs", len(streams), 0)
+        self.kinds["a run that never began"] += None in ends
+        self.kinds["an interrupted run without a record"] += expected
+        self.kinds["an interrupted run with a record"] += has_record
+
+    def compare_csv(self, name, rows, of_experiments, records):
+        if of_experiments:
+            expected = [(record["name"], *one) for record in records for one in record["measurements"]]
+            self.check(f"{name} csv", report_readers.read_experiment_csv(rows), expected)
+            return
+        self.check(f"{name} csv: header", rows.pop(0), report_readers.CSV_HEADER)
+        for place, record in enumerate(records):
+            count = max(1, len(record["results"]))
+            got = report_readers.read_csv(rows[:count])
+            self.check_record(f"{name} {place} csv", got, report_readers.expected_of_csv(record))
+            self.check(f"{name} {place} csv: stage", got["error stage"], record["error stage"])
+            del rows[:count]
+        self.check(f"{name} csv: lines left", rows, [])
+
+    def compare_text(self, name, lines, of_experiments, records, interrupted):
+        for place, record in enumerate(records):
+            expected = report_readers.expected_of_text(record, of_experiments)
+            self.check_record(f"{name} {place} text", report_readers.read_text(lines, expected), expected)
+        left = [line.decode("utf-8", "replace") for line in lines.rest()]
+        self.check(f"{name} text: end", left, [*text_end(records, of_experiments, interrupted), ""])
+
+    def count_kinds(self, of_experiments, records):
+        for record in records:
+            self.kinds[f"{'an experiment' if of_experiments else 'a diagnostic'}: {record['verdict']}"] += 1
+            self.kinds["no results"] += not record["results"]
+            self.kinds["many results"] += len(record["results"]) > 100
+            self.kinds["a deep error"] += len(record["errors"]) > 20
+            for one in record["results"]:
+                self.kinds["a value that is not finite"] += one.value in ("nan", "inf", "-inf")
+                self.kinds["a limit without bounds"] += one.limit is not None and one.limit[1:] == (None, None)
+                self.kinds[f"a result: {one.verdict}"] += 1
+            text = json.dumps(record, ensure_ascii=False)
+            for sign in SIGNS:
+                self.kinds[f"a text with {sign!r}"] += sign in text
+
+
+def reports_in(file):
+    """The reports of one format, a run's after the other."""
+    content = file.read_bytes()
+    at = 0
+    while at < len(content):
+        end = content.index(b"\n", at) + 1
+        at = end + int(content[at:end])
+        yield content[end:at]
+
+
+def main():
+    count = COUNT * 10 if os.environ.get("QUAZOR_THOROUGH") == "1" else COUNT
+    comparison = Comparison()
+    with tempfile.TemporaryDirectory() as directory:
+        subprocess.run([sys.argv[1], directory, str(count), str(SEED)], check=True)
+        forms = {file.name: list(reports_in(file)) for file in pathlib.Path(directory).iterdir()}
+    comparison.check("reports", {form: len(reports) for form, reports in forms.items()}, dict.fromkeys(FORMS, count))
+    for run, reports in enumerate(zip(*forms.values())):
+        try:
+            comparison.compare(f"run {run}", dict(zip(forms, reports)))
+        except (ValueError, LookupError, AttributeError, TypeError, xml.etree.ElementTree.ParseError) as problem:
+            comparison.found.append(f"run {run}: cannot be read back: {type(problem).__name__}: {problem}")
+    comparison.check("kinds of runs that are missing", {kind for kind in KINDS if not comparison.kinds[kind]}, set())
+    for one in comparison.found[:SHOWN]:
+        print(one)
+    print(f"{count} runs, {len(comparison.found)} differences")
+    return 1 if comparison.found else 0
+
+
+if __name__ == "__main__":
+    sys.exit(main())
