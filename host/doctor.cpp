@@ -112,7 +112,7 @@ class Doctor {
       tell(true, "last run", file.string(), "there was none");
     } else {
       check("last run", file.string(),
-            [&] { return countText(namesNotPassed(file).size(), "diagnostic") + " did not pass"; });
+            [&] { return countText(namesNotPassed(runIn(file)).size(), "diagnostic") + " did not pass"; });
     }
   }
 

@@ -1,7 +1,5 @@
 #include "host/last_run.h"
 
-#include "host/record_file.h"
-
 #include <algorithm>
 #include <cstdlib>
 
@@ -27,8 +25,7 @@ std::filesystem::path lastRunFile() {
   return state / "quazor" / "last_run.jsonl";
 }
 
-std::vector<std::string> namesNotPassed(const std::filesystem::path& record) {
-  const RecordedRun run = runIn(record);
+std::vector<std::string> namesNotPassed(const RecordedRun& run) {
   std::vector<std::string> names;
   for (const std::string& name : run.began.names) {
     const bool passed = std::any_of(run.records.begin(), run.records.end(), [&name](const DiagnosticRecord& one) {

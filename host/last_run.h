@@ -1,6 +1,8 @@
 // The record that is kept of the last run, for those who did not ask for one.
 #pragma once
 
+#include "host/record_file.h"
+
 #include <filesystem>
 #include <string>
 #include <vector>
@@ -11,8 +13,8 @@ namespace quazor {
 // when the environment tells neither.
 std::filesystem::path lastRunFile();
 
-// The names of the diagnostics of a record that did not pass, or did not come to their end, in their order; those that
-// were to be run and were not are among them. Throws a Refusal (kCannotRead) when the record cannot be read.
-std::vector<std::string> namesNotPassed(const std::filesystem::path& record);
+// The names of what did not pass, or did not come to its end, in their order; what was to be run and was not is among
+// them.
+std::vector<std::string> namesNotPassed(const RecordedRun& run);
 
 }  // namespace quazor

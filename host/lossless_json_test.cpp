@@ -32,7 +32,7 @@ std::string problemOf(const std::function<void()>& read) {
 
 TEST(LosslessValue, KeepsEveryValue) {
   RandomValues random(1);
-  constexpr int kValues = 20'000;
+  constexpr int kValues = 10'000;
   for (int i = 0; i < kValues; ++i) {
     const Value value = random.value(4);
     ASSERT_TRUE(isSame(back(value), value)) << i << ": " << losslessValue(value).dump();
@@ -40,14 +40,14 @@ TEST(LosslessValue, KeepsEveryValue) {
 }
 
 TEST(LosslessValue, KeepsFloatsOfEveryKind) {
-  // One in 40,009, which is a prime: every sign, every exponent, and mantissas of all kinds.
+  // One in 80,021, which is a prime: every sign, every exponent, and mantissas of all kinds.
   std::uint64_t count = 0;
-  for (std::uint64_t bits = 0; bits <= UINT32_MAX; bits += 40'009) {
+  for (std::uint64_t bits = 0; bits <= UINT32_MAX; bits += 80'021) {
     const Value value(std::bit_cast<float>(static_cast<std::uint32_t>(bits)));
     ASSERT_TRUE(isSame(back(value), value)) << std::hex << bits;
     ++count;
   }
-  EXPECT_GT(count, 100'000U);
+  EXPECT_GT(count, 50'000U);
   using Limits = std::numeric_limits<float>;
   for (const float one : {0.0F, -0.0F, Limits::max(), Limits::lowest(), Limits::min(), Limits::denorm_min(),
                           Limits::infinity(), -Limits::infinity(), Limits::quiet_NaN(), 0.1F}) {
@@ -134,7 +134,7 @@ TEST(LosslessText, AgreesWithTheJsonLibraryOnWhatIsUtf8) {
 
 TEST(LosslessResult, KeepsEveryResult) {
   RandomValues random(4);
-  for (int i = 0; i < 10'000; ++i) {
+  for (int i = 0; i < 5'000; ++i) {
     const QZMeasuredResult result = random.result();
     ASSERT_TRUE(isSame(resultFrom(throughText(losslessResult(result))), result)) << losslessResult(result).dump();
   }

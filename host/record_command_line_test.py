@@ -329,6 +329,17 @@ class OnlyFailedTest(RecordTest):
 
     def test_what_is_refused(self):
         self.assert_refused(self.only_failed(), 66, "there is no record of a last run; --of RECORD names one")
+
+    def test_takes_the_plug_ins_of_that_run(self):
+        failing = ["--set", "measured=1", "--set", "minimum=90"]
+        self.assertEqual(self.run_fake(*failing, env=self.state).returncode, 1)
+        result = quazor("run", "--only", "failed", "--phone", self.phone, "--profile", "none", "--set", "duration=1",
+                        env=self.state)
+        self.assertIn("Fake.One", result.stdout, result.stderr)
+
+    def test_a_plug_in_that_could_not_be_loaded(self):
+        self.run_fake("--plugin", PLUGINS / "fatal_plugin.so", env=self.state)
+        self.assert_refused(self.only_failed(), 66, "the plug-in fatal_plugin.so could not be loaded in that run")
         self.assert_refused(self.only_failed("--of", self.directory / "missing"), 66, "missing' cannot be read")
         self.assert_refused(self.only_failed("--of", self.phone), 66, "holds no event")
         self.assert_refused(self.only_failed("--all"), 64, "without names and without --all")

@@ -141,14 +141,22 @@ ExitCode perform(const Options& options, const Installation& installation, Conso
   return events.exitCode();
 }
 
-// The options with the names of what did not pass in place of --only failed.
+// The options with the names of what did not pass in place of --only failed, and the plug-ins that they were in.
 Options withFailedNames(Options options) {
   const std::filesystem::path record = options.failedOf.empty() ? lastRunFile() : options.failedOf;
   if (record.empty() || (options.failedOf.empty() && !std::filesystem::exists(record))) {
     throw Refusal(ExitCode::kCannotRead, "there is no record of a last run; --of RECORD names one");
   }
-  options.names = namesNotPassed(record);
-  options.all = false;
+  const RecordedRun run = runIn(record);
+  for (const DiagnosticRecord& one : run.records) {
+    if (!one.experimentName.empty()) continue;  // it is no plug-in
+    throw Refusal(ExitCode::kCannotRead,
+                  "the plug-in " + one.name +
+                      " could not be loaded in that run, so what it holds was not run; name what "
+                      "is to be run, or give --all");
+  }
+  options.names = namesNotPassed(run);
+  if (options.plugins.empty()) options.plugins.assign(run.began.plugins.begin(), run.began.plugins.end());
   return options;
 }
 

@@ -105,7 +105,7 @@ TEST(EventFrom, ReadsBackWhatIsLeftOut) {
 
 TEST(EventFrom, KeepsEveryContent) {
   RandomValues random(1);
-  for (int i = 0; i < 1500; ++i) {
+  for (int i = 0; i < 1000; ++i) {
     const std::string key = random.text();
     const Value value = random.value(3);
     const auto collected = std::get<Collected>(back(Collected{key, value}));
