@@ -17,7 +17,9 @@ class ThreadWaiter final : public RunLoopWaiter {
   std::chrono::nanoseconds now() override { return std::chrono::steady_clock::now().time_since_epoch(); }
 
   void wait(std::chrono::nanoseconds deadline, const std::function<bool()>& ready) override {
-    if (watch_.lookOut(ready, [this] { return now(); }, deadline)) return;
+    if (watch_.lookOut(
+            ready, [this] { return now(); }, deadline))
+      return;
     for (;;) {
       parker_.prepare();
       // Whoever changes what `ready` asks for and finds no sleeper did so before `ready` is asked here.
