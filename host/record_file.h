@@ -54,7 +54,7 @@ struct RecordedRun {
   std::optional<RunEnded> ended;  // nothing: the run did not come to its end
 };
 
-// The runs are told apart by their first event, which must be a RunBegan. Throws a Refusal (kCannotRead).
+// The run that a record holds, as far as it came. Throws the Refusals of readRecord.
 RecordedRun runIn(const std::filesystem::path& file);
 
 }  // namespace quazor
