@@ -41,19 +41,26 @@ std::string quoted(const std::string& text) {
   return word + "'";
 }
 
+// `before` is what stands between the line and the word, blanks too.
+void addWord(std::string& line, std::string_view before, const std::string& word) {
+  line += before;
+  line += quoted(word);
+}
+
 void addSettings(std::string& line, std::string_view half, const std::vector<BoundParameter>& parameters) {
   for (const BoundParameter& one : parameters) {
-    if (one.value) line += " --set " + quoted(formatMessage("%@.%@=%@", half, one.name, *one.value));
+    if (one.value) addWord(line, " --set ", formatMessage("%@.%@=%@", half, one.name, *one.value));
   }
 }
 
 // The command that runs them again, and nothing else.
 std::string commandOf(const RunBegan& run, const std::vector<std::string>& names, const BoundParameters& parameters) {
   std::string line = run.ofExperiments ? "quazor experiment" : "quazor run";
-  for (const std::string& name : names) line += " " + quoted(name);
-  for (const std::string& plugin : run.plugins) line += " --plugin " + quoted(plugin);
-  if (!run.phone.empty()) line += " --phone " + quoted(run.phone);
-  line += " --seed " + std::to_string(run.seed) + " --profile none";
+  for (const std::string& name : names) addWord(line, " ", name);
+  for (const std::string& plugin : run.plugins) addWord(line, " --plugin ", plugin);
+  if (!run.phone.empty()) addWord(line, " --phone ", run.phone);
+  line += " --seed " + std::to_string(run.seed);
+  line += " --profile none";
   addSettings(line, "experiment", parameters.experiment);
   addSettings(line, "analysis", parameters.analysis);
   return line;

@@ -52,6 +52,13 @@ RunEvent eventInLine(const std::filesystem::path& file, std::uint64_t sequence, 
 
 }  // namespace
 
+std::string recordLine(const RunEvent& event, std::uint64_t sequence) {
+  Json line = {{"sequence", sequence}};
+  if (sequence == 0) line["record"] = kRecordFormat;
+  line.update(eventJson(event));
+  return line.dump(-1, ' ', false, Json::error_handler_t::replace) + "\n";
+}
+
 RecordWriter::RecordWriter(std::filesystem::path file) : file_(std::move(file)) {
   const auto refuse = [this](const std::string& why) {
     throw Refusal(ExitCode::kCannotWrite, "the record '" + file_.string() + "' cannot be written: " + why);
@@ -80,13 +87,10 @@ RecordWriter::RecordWriter(std::filesystem::path file) : file_(std::move(file)) 
 
 RecordWriter::~RecordWriter() { ::close(descriptor_); }
 
-void RecordWriter::take(const RunEvent& event) {
+void RecordWriter::take(const RunEvent& event, const std::string& line) {
+  ++taken_;
   if (!problem_.empty()) return;
-  Json line = {{"sequence", sequence_}};
-  if (sequence_ == 0) line["record"] = kRecordFormat;
-  line.update(eventJson(event));
-  ++sequence_;
-  write(line.dump(-1, ' ', false, Json::error_handler_t::replace) + "\n");
+  write(line);
   // What a run comes to must survive the machine, too.
   if (std::holds_alternative<RunEnded>(event) && problem_.empty()) ::fdatasync(descriptor_);
 }

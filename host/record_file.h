@@ -13,6 +13,9 @@ namespace quazor {
 // The version of the form of records.
 inline constexpr int kRecordFormat = 1;
 
+// The line of a record that holds the event, with the line's end. `sequence` is the number of events before it.
+std::string recordLine(const RunEvent& event, std::uint64_t sequence);
+
 // Writes a record while the run goes on. A line is handed to the system as a whole before take() returns, so that
 // what has been taken is in the file whatever happens to this process, and a file that was cut off ends in a line
 // without an end.
@@ -23,7 +26,9 @@ class RecordWriter final : public RunEventSink {
   ~RecordWriter() override;
 
   // After a failure nothing more is written.
-  void take(const RunEvent& event) override;
+  void take(const RunEvent& event) override { take(event, recordLine(event, taken_)); }
+  // The same for who has the line already: it is the event's in all records of one run.
+  void take(const RunEvent& event, const std::string& line);
 
   const std::filesystem::path& file() const { return file_; }
   // Why something could not be written; the empty text when all was.
@@ -34,7 +39,7 @@ class RecordWriter final : public RunEventSink {
 
   const std::filesystem::path file_;
   int descriptor_ = -1;
-  std::uint64_t sequence_ = 0;
+  std::uint64_t taken_ = 0;
   std::string problem_;
 };
 

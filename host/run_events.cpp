@@ -44,7 +44,11 @@ void RunEvents::take(const RunEvent& event) {
 }
 
 void RunEvents::pass(const RunEvent& event) {
-  for (const std::unique_ptr<RecordWriter>& record : records_) record->take(event);
+  if (!records_.empty()) {
+    // A million log lines are made into text once, not once for each record.
+    const std::string line = recordLine(event, recorded_++);
+    for (const std::unique_ptr<RecordWriter>& record : records_) record->take(event, line);
+  }
   builder_.take(event);
   if (const auto* const logged = std::get_if<Logged>(&event); logged != nullptr && systemLog_ != nullptr) {
     systemLog_->write(logged->line.level, sharedLog().subsystem(), sharedLog().category(), logged->line.text);

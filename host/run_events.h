@@ -6,6 +6,7 @@
 #include "host/record_file.h"
 #include "host/run_report.h"
 
+#include <cstdint>
 #include <memory>
 #include <mutex>
 #include <optional>
@@ -42,6 +43,7 @@ class RunEvents final : public RunEventSink {
 
   std::vector<std::unique_ptr<RecordWriter>> records_;
   std::size_t required_ = 0;  // so many of them, from the first, were asked for
+  std::uint64_t recorded_ = 0;
   std::shared_ptr<LogBackend> systemLog_;
   RecordBuilder builder_;
   RunReport report_;

@@ -22,7 +22,8 @@ void RunReport::take(const RunEvent& event) {
     const LogLine& line = logged->line;
     if (line.level > options_.shownLog) return;
     progress_.aside([&] {
-      console_.err << readableLogLine(line.date, line.level, sharedLog().category(), line.text) << std::flush;
+      console_.err << readableLogLine(line.date, line.level, sharedLog().category(), printableLines(line.text))
+                   << std::flush;
     });
   } else if (std::holds_alternative<DiagnosticEnded>(event)) {
     finishDiagnostic();

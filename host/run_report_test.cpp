@@ -266,6 +266,28 @@ TEST_F(RunReportTest, ShowsLogLinesUpToTheirLevelByTheWallClock) {
                             "2026-11-21 01:08:01.000 default " + category + ": two\n    lines\n");
 }
 
+TEST_F(RunReportTest, ShowsLogLinesThatCannotSteerTheTerminal) {
+  RunReport report({}, console_);
+  report.take(beginningOf("A"));
+  report.take(Logged{{{}, LogLevel::kError, "a\033[2Jb\r\xFF\xC2\x9B\tc\nd\a\n", momentAt(250)}});
+  const std::string category(sharedLog().category());
+  EXPECT_EQ(err_.str(), "2026-11-21 01:08:00.250 error " + category + ": a\\x1b[2Jb\\x0d\\xff\\x9b\tc\n    d\\x07\n");
+}
+
+TEST_F(RunReportTest, ShowsNothingThatIsNotUtf8OnTheStandardOutput) {
+  RunReport report({}, console_);
+  report.take(runOf({}));
+  DiagnosticRecord record = quietRecord("N\xFF", Verdict::kError);
+  record.measuredResults.clear();
+  record.measuredResults.push_back({QZMeasuredResult("r\xC3", Measurement(1, QZDimensionlessUnit::frames())), {}});
+  record.error = makeError("D", 1, "it\x80 broke");
+  takeAll(report, eventsOf(record));
+  end(report);
+  EXPECT_THAT(out_.str(), HasSubstr("N\\xff\n"));
+  EXPECT_THAT(out_.str(), HasSubstr("  r\\xc3 "));
+  EXPECT_THAT(out_.str(), HasSubstr("D code 1: it\\x80 broke\n"));
+}
+
 TEST_F(RunReportTest, ShowsTheProgressOfWhatIsRunning) {
   console_.showsProgress = true;
   RunReport report({}, console_);

@@ -1,5 +1,7 @@
 #include "host/table.h"
 
+#include "host/utf8.h"
+
 #include <algorithm>
 #include <utility>
 
@@ -17,9 +19,38 @@ std::size_t widthOf(std::string_view text) {
 bool isControl(unsigned char unit) { return unit < 0x20 || unit == 0x7F; }
 
 // The control characters U+0080 to U+009F, two bytes in UTF-8: terminals obey them too.
-bool isWideControl(std::string_view rest) {
-  return rest.size() >= 2 && rest[0] == '\xC2' && static_cast<unsigned char>(rest[1]) < 0xA0 &&
-         static_cast<unsigned char>(rest[1]) >= 0x80;
+bool isWideControl(std::string_view character) {
+  return character.size() == 2 && character[0] == '\xC2' && static_cast<unsigned char>(character[1]) < 0xA0;
+}
+
+void appendEscaped(std::string& shown, std::string_view bytes) {
+  constexpr std::string_view kDigits = "0123456789abcdef";
+  for (const char byte : bytes) {
+    const auto unit = static_cast<unsigned char>(byte);
+    shown += "\\x";
+    shown += kDigits[unit >> 4U];
+    shown += kDigits[unit & 0xFU];
+  }
+}
+
+// With what steers a terminal, and what is no text at all, shown as \xNN; but for the characters of `kept`.
+std::string shownText(std::string_view text, std::string_view kept) {
+  std::string shown;
+  shown.reserve(text.size());
+  while (!text.empty()) {
+    const Utf8Sequence sequence = firstUtf8Sequence(text);
+    const std::string_view character = text.substr(0, sequence.length);
+    text.remove_prefix(sequence.length);
+    if (isWideControl(character)) {
+      appendEscaped(shown, character.substr(1));  // the code point's number is that of its second byte
+    } else if (!sequence.wellFormed || (isControl(static_cast<unsigned char>(character.front())) &&
+                                        kept.find(character.front()) == std::string_view::npos)) {
+      appendEscaped(shown, character);
+    } else {
+      shown += character;
+    }
+  }
+  return shown;
 }
 
 // Up to the next blank outside of back quotes; takes it, and the blanks after it, off the text.
@@ -34,26 +65,9 @@ std::string_view takeWord(std::string_view& text) {
 
 }  // namespace
 
-std::string printable(std::string_view text) {
-  constexpr std::string_view kDigits = "0123456789abcdef";
-  std::string shown;
-  const auto escape = [&shown, kDigits](unsigned char unit) {
-    shown += "\\x";
-    shown += kDigits[unit >> 4U];
-    shown += kDigits[unit & 0xFU];
-  };
-  for (std::size_t at = 0; at < text.size(); ++at) {
-    const auto unit = static_cast<unsigned char>(text[at]);
-    if (isWideControl(text.substr(at))) {
-      escape(static_cast<unsigned char>(text[++at]));
-    } else if (isControl(unit)) {
-      escape(unit);
-    } else {
-      shown += text[at];
-    }
-  }
-  return shown;
-}
+std::string printable(std::string_view text) { return shownText(text, ""); }
+
+std::string printableLines(std::string_view text) { return shownText(text, "\t\n"); }
 
 std::string indentedLines(std::string_view text, std::string_view indent) {
   std::string lines;

@@ -9,9 +9,12 @@
 
 namespace quazor {
 
-// The text with its control characters, new lines too, shown as \xNN: what a plug-in or a file says must not steer the
-// reader's terminal.
+// The text with its control characters, new lines too, and each byte that is not UTF-8 shown as \xNN: what a plug-in or
+// a file says must not steer the reader's terminal, nor break its text.
 std::string printable(std::string_view text);
+
+// As printable, but tabs and new lines stay: for text that may have several lines.
+std::string printableLines(std::string_view text);
 
 // As printable, but each line of the text begins with `indent` and ends with a new line.
 std::string indentedLines(std::string_view text, std::string_view indent);

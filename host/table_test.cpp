@@ -47,7 +47,25 @@ TEST(Printable, ShowsControlCharacters) {
   EXPECT_EQ(printable("\xC2\x9B"
                       "31m"),
             "\\x9b31m");
-  EXPECT_EQ(printable("\xC2\xA0\xC2"), "\xC2\xA0\xC2");
+  EXPECT_EQ(printable("\xC2\xA0"), "\xC2\xA0");
+  EXPECT_EQ(printable("\xC3\x9B"), "\xC3\x9B");
+}
+
+TEST(Printable, ShowsEachByteThatIsNotUtf8) {
+  EXPECT_EQ(printable("a\xFFz"), "a\\xffz");
+  EXPECT_EQ(printable("\x9B"
+                      "31m"),
+            "\\x9b31m");
+  EXPECT_EQ(printable("\xC2"), "\\xc2");
+  EXPECT_EQ(printable("\xE2\x82\033[m\xE2\x82\xAC"), "\\xe2\\x82\\x1b[m\xE2\x82\xAC");
+  EXPECT_EQ(printable("\xED\xA0\x80"), "\\xed\\xa0\\x80");
+}
+
+TEST(PrintableLines, KeepsTabsAndNewLinesAndNothingElseThatSteers) {
+  EXPECT_EQ(printableLines("one\ttwo\nthree\r\n"), "one\ttwo\nthree\\x0d\n");
+  EXPECT_EQ(printableLines("a\033[2Jb\a\x7F\xFF\xC2\x9B"), "a\\x1b[2Jb\\x07\\x7f\\xff\\x9b");
+  EXPECT_EQ(printableLines(std::string_view("\0\n", 2)), "\\x00\n");
+  EXPECT_EQ(printableLines("\xC3\xA9"), "\xC3\xA9");
 }
 
 TEST(IndentedLines, IndentsEachLine) {
