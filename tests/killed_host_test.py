@@ -23,6 +23,7 @@ import time
 import unittest
 
 from marked_processes import end_processes, environment_with_marker, processes_in
+from report_readers import printable
 
 KILLS = 200 if os.environ.get("QUAZOR_THOROUGH") == "1" else 20
 SEED = int(os.environ.get("QUAZOR_SEED", "1"))
@@ -139,8 +140,8 @@ class KilledHostTest(unittest.TestCase):
         self.assertEqual(killed.left, [], "processes are left")
         self.assertEqual(killed.verdicts, recorded_verdicts(killed.events)[:len(killed.verdicts)])
         logged = [one for one in killed.events if one["event"] == "log" and isinstance(one["text"], str)]
-        recorded = collections.Counter((one["level"], one["text"]) for one in logged)
-        seen = collections.Counter((level, text) for level, text in killed.log if text.isprintable())
+        recorded = collections.Counter((one["level"], printable(one["text"])) for one in logged)
+        seen = collections.Counter((level, text) for level, text in killed.log if r"\x" not in text)
         self.assertEqual(seen - recorded, collections.Counter(), "lines were seen that are not in the record")
         if not killed.events:  # it was killed before it could have shown anything
             self.assertEqual((killed.verdicts, killed.log), ([], []))

@@ -30,6 +30,20 @@ def printable(text):
     return re.sub("[\x00-\x1f\x7f-\x9f]", lambda found: f"\\x{ord(found[0]):02x}", text)
 
 
+def blurred(value):
+    """The value with each stretch that is not UTF-8 as one U+FFFD, in all its texts: JSON has such signs where people
+    are shown the bytes as \\xNN, one that looks like a control character among them."""
+    if isinstance(value, str):
+        return re.sub(r"(?:\ufffd|\\x[89a-f][0-9a-f])+", "\ufffd", value)
+    if isinstance(value, dict):
+        return {blurred(key): blurred(one) for key, one in value.items()}
+    if isinstance(value, tuple) and hasattr(value, "_fields"):
+        return type(value)(*map(blurred, value))
+    if isinstance(value, (list, tuple)):
+        return type(value)(map(blurred, value))
+    return value
+
+
 def in_xml(text):
     """As XML 1.0 can hold it."""
     return re.sub("[\x00-\x08\x0b\x0c\x0e-\x1f\ufffe\uffff]", "\ufffd", text)
