@@ -54,12 +54,6 @@ std::string_view nounOf(Wanted wanted) {
   return "diagnostic or experiment";
 }
 
-bool contains(const std::vector<Diagnostic>& diagnostics, const Diagnostic& wanted) {
-  return std::any_of(diagnostics.begin(), diagnostics.end(), [&wanted](const Diagnostic& one) {
-    return one.name == wanted.name && one.experimentOnly == wanted.experimentOnly;
-  });
-}
-
 [[noreturn]] void refuseName(const std::vector<Diagnostic>& catalogue, Wanted wanted, const std::string& name) {
   const std::string quoted = "'" + name + "'";
   const std::string noun(nounOf(wanted));
@@ -87,6 +81,7 @@ std::vector<Diagnostic> catalogueOf(const QZLab& lab) {
     if (one.kind != QZLab::Kind::kDiagnostic) continue;
     const QZLab::Registration* experiment = lab.find(QZLab::Kind::kExperiment, one.experimentName);
     const QZLab::Registration* analysis = lab.find(QZLab::Kind::kAnalysis, one.analysisName);
+    if (experiment == nullptr || analysis == nullptr) continue;
     catalogue.push_back({one.name, one.summary, one.experimentName, one.analysisName, experiment->makeExperiment,
                          analysis->makeAnalysis});
   }
@@ -123,6 +118,13 @@ DiagnosticDescription describeDiagnostic(const Diagnostic& diagnostic) {
   return description;
 }
 
+DiagnosticDescription describeIfWanted(const Diagnostic& diagnostic, const std::vector<Diagnostic>& wanted) {
+  if (contains(wanted, diagnostic)) return describeDiagnostic(diagnostic);
+  DiagnosticDescription none;
+  none.isAsked = false;
+  return none;
+}
+
 std::vector<Diagnostic> allOf(const std::vector<Diagnostic>& catalogue, Wanted wanted) {
   return thoseThat(catalogue, [wanted](const Diagnostic& one) { return isWanted(one, wanted); });
 }
@@ -143,6 +145,12 @@ std::vector<Diagnostic> selectDiagnostics(const std::vector<Diagnostic>& catalog
     }
   }
   return selected;
+}
+
+bool contains(const std::vector<Diagnostic>& diagnostics, const Diagnostic& wanted) {
+  return std::any_of(diagnostics.begin(), diagnostics.end(), [&wanted](const Diagnostic& one) {
+    return one.name == wanted.name && one.experimentOnly == wanted.experimentOnly;
+  });
 }
 
 bool matchesName(const std::string& pattern, const std::string& name) {

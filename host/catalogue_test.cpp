@@ -65,6 +65,22 @@ TEST_F(CatalogueTest, KnowsOfAnExperimentWhichDiagnosticsHaveIt) {
   EXPECT_THAT(catalogue_[5].usedBy, ElementsAre());
 }
 
+TEST_F(CatalogueTest, LeavesOutADiagnosticOfWhichAHalfIsNotRegistered) {
+  const std::size_t before = catalogue_.size();
+  lab_.addDiagnosticWithName("No.Experiment", "", "Nothing", "Analysis");
+  lab_.addDiagnosticWithName("No.Analysis", "", "Experiment", "Nothing");
+  EXPECT_EQ(catalogueOf(lab_).size(), before);
+}
+
+TEST_F(CatalogueTest, DescribesOnlyWhatIsWanted) {
+  const DiagnosticDescription wanted = describeIfWanted(catalogue_[5], {catalogue_[5]});
+  EXPECT_TRUE(wanted.isAsked);
+  EXPECT_EQ(wanted.experiment.summary(), "Measures what it is told to.");
+  const DiagnosticDescription unwanted = describeIfWanted(catalogue_[5], {catalogue_[4]});
+  EXPECT_FALSE(unwanted.isAsked);
+  EXPECT_EQ(unwanted.experiment.summary(), "");
+}
+
 TEST_F(CatalogueTest, GivesAllThatIsWanted) {
   EXPECT_THAT(namesOf(allOf(catalogue_, Wanted::kDiagnostics)), ElementsAre("Sync.Back", "Sync.Front", "Fault", "Sy*"));
   EXPECT_THAT(namesOf(allOf(catalogue_, Wanted::kExperiments)), ElementsAre("Experiment", "Image.Alone"));

@@ -31,8 +31,11 @@ ExitCode tellFailed(const std::vector<FailedPlugin>& failed, Console& console, E
 
 ExitCode list(const Options& options, const Installation& installation, Console& console) {
   // A diagnostic's summary is known without making anything of it.
-  const auto isDescribed = [](const Diagnostic& one) { return one.experimentOnly && one.usedBy.empty(); };
-  const Survey survey = surveyOf(options, installation, isDescribed);
+  const auto lonely = [](std::vector<Diagnostic> all) {
+    std::erase_if(all, [](const Diagnostic& one) { return !one.experimentOnly || !one.usedBy.empty(); });
+    return all;
+  };
+  const Survey survey = surveyOf(options, installation, lonely);
   std::vector<DescribedDiagnostic> listed;
   for (const DescribedDiagnostic& one : survey.catalogue) {
     if (one.diagnostic.usedBy.empty()) listed.push_back(one);

@@ -104,7 +104,9 @@ class Completer {
     }
     try {
       std::vector<DescribedDiagnostic> all =
-          surveyOf(options, installation_, [described](const Diagnostic& /*one*/) { return described; }).catalogue;
+          surveyOf(options, installation_, [described](const std::vector<Diagnostic>& everything) {
+            return described ? everything : std::vector<Diagnostic>();
+          }).catalogue;
       std::vector<DescribedDiagnostic> named;
       std::copy_if(all.begin(), all.end(), std::back_inserter(named), [this](const DescribedDiagnostic& one) {
         return std::find(words_.begin(), words_.end() - 1, one.diagnostic.name) != words_.end() - 1;

@@ -70,7 +70,7 @@ class Doctor {
   std::string findingOfPlugin(const std::filesystem::path& plugin) const {
     Options alone = options_;
     alone.plugins = {plugin};
-    const Survey survey = surveyOf(alone, installation_, [](const Diagnostic& /*one*/) { return true; });
+    const Survey survey = surveyOf(alone, installation_, [](const std::vector<Diagnostic>& all) { return all; });
     if (!survey.failed.empty()) {
       throw Refusal(ExitCode::kCannotRead, survey.failed.front().error->localizedDescription());
     }

@@ -80,6 +80,10 @@ DiagnosticErrorPtr errorOf(const Supervised& supervised, const std::string& duri
                        during + " took longer than its deadline of " + secondsText(deadline) + stuck);
     case SupervisionEnd::kInterrupted:
       return hostError(HostErrorCode::kInterrupted, during + " was interrupted" + stuck);
+    case SupervisionEnd::kLineTooLong:
+      return hostError(HostErrorCode::kConnectionLost,
+                       during + " wrote more than " + std::to_string(kLongestEvent >> 20U) +
+                           " MiB in one line of its process' connection to quazor" + stuck);
     case SupervisionEnd::kConnectionLost: break;
     case SupervisionEnd::kEnded: {
       const ProcessEnd& end = *supervised.end;
@@ -94,16 +98,37 @@ DiagnosticErrorPtr errorOf(const Supervised& supervised, const std::string& duri
                    during + " closed or overwrote its process' connection to quazor" + stuck);
 }
 
+// The files that register the diagnostic and its halves.
+std::vector<std::filesystem::path> pluginsOf(const Diagnostic& one, const std::vector<LoadedPlugin>& loaded) {
+  const auto isPart = [&one](const QZLab::Registration& registration) {
+    switch (registration.kind) {
+      case QZLab::Kind::kDiagnostic: return !one.experimentOnly && registration.name == one.name;
+      case QZLab::Kind::kExperiment: return registration.name == one.experimentName;
+      case QZLab::Kind::kAnalysis: break;
+    }
+    return !one.experimentOnly && registration.name == one.analysisName;
+  };
+  const std::vector<QZLab::Registration>& registrations = QZLab::defaultLab().registrations();
+  std::vector<std::filesystem::path> files;
+  auto first = registrations.begin();
+  for (const LoadedPlugin& plugin : loaded) {
+    const auto last = registrations.begin() + static_cast<std::ptrdiff_t>(plugin.last);
+    if (std::any_of(first, last, isPart)) files.push_back(plugin.file);
+    first = last;
+  }
+  return files;
+}
+
 // One attempt at a survey: what a process says until it ends.
 class SurveyAttempt {
  public:
   SurveyAttempt(const IsolationOptions& options, const std::vector<std::filesystem::path>& plugins, Survey& survey,
-                const std::function<bool(const Diagnostic&)>& isDescribed)
+                const DiagnosticChoice& described)
       : deadlines_({}, options.deadlines),
         memory_(options.memory),
         plugins_(plugins),
         survey_(survey),
-        isDescribed_(isDescribed),
+        described_(described),
         known_(survey.catalogue.size()) {}
 
   // True when the survey is complete.
@@ -134,19 +159,19 @@ class SurveyAttempt {
   // In the child.
   void speak(const Connection& connection) const {
     try {
-      loadPlugins(plugins_, [&connection](const std::filesystem::path& file) {
+      const std::vector<LoadedPlugin> loaded = loadPlugins(plugins_, [&connection](const std::filesystem::path& file) {
         connection.say({{"says", "loading"}, {"plugin", losslessText(file.string())}});
       });
-      const std::vector<Diagnostic> catalogue = catalogueOf(QZLab::defaultLab());
+      std::vector<Diagnostic> catalogue = catalogueOf(QZLab::defaultLab());
+      for (Diagnostic& one : catalogue) one.plugins = pluginsOf(one, loaded);
       Json all = Json::array();
       for (const Diagnostic& one : catalogue) all.push_back(diagnosticJson(one));
       connection.say({{"says", "catalogue"}, {"catalogue", std::move(all)}});
+      const std::vector<Diagnostic> wanted = described_(catalogue);
       for (std::size_t i = known_; i < catalogue.size(); ++i) {
         connection.say({{"says", "describing"}});
-        const bool wanted = isDescribed_(catalogue[i]);
         connection.say(
-            {{"says", "described"},
-             {"description", descriptionJson(wanted ? describeDiagnostic(catalogue[i]) : DiagnosticDescription())}});
+            {{"says", "described"}, {"description", descriptionJson(describeIfWanted(catalogue[i], wanted))}});
       }
       connection.say({{"says", "done"}});
     } catch (const Refusal& refusal) {
@@ -184,7 +209,7 @@ class SurveyAttempt {
   }
 
   void describe(DiagnosticDescription description) {
-    if (survey_.catalogue.size() == catalogue_.size()) throw BadRecord("there is more described than there is");
+    if (survey_.catalogue.size() >= catalogue_.size()) throw BadRecord("there is more described than there is");
     survey_.catalogue.push_back({catalogue_[survey_.catalogue.size()], std::move(description)});
   }
 
@@ -211,7 +236,7 @@ class SurveyAttempt {
   const std::optional<std::uint64_t> memory_;
   const std::vector<std::filesystem::path>& plugins_;
   Survey& survey_;
-  const std::function<bool(const Diagnostic&)>& isDescribed_;
+  const DiagnosticChoice& described_;
   const std::size_t known_;
   std::vector<Diagnostic> catalogue_;
   std::optional<std::string> loading_;
@@ -306,6 +331,16 @@ class IsolatedRun {
   bool completed_ = false;
 };
 
+// Those of the plug-ins that the diagnostic needs: another one that ends its process would end this one's.
+std::vector<std::filesystem::path> pluginsFor(const Diagnostic& diagnostic,
+                                              std::vector<std::filesystem::path> plugins) {
+  if (diagnostic.plugins.empty()) return plugins;
+  std::erase_if(plugins, [&needed = diagnostic.plugins](const std::filesystem::path& file) {
+    return std::find(needed.begin(), needed.end(), file) == needed.end();
+  });
+  return plugins;
+}
+
 // In the child: the catalogue's own diagnostic, with its factories; nothing, and a failure, when there is none.
 std::optional<Diagnostic> loadDiagnostic(const IsolationOptions& options, const Diagnostic& wanted,
                                          RunEventSink& events) {
@@ -313,7 +348,7 @@ std::optional<Diagnostic> loadDiagnostic(const IsolationOptions& options, const 
   events.take(StageBegan{Stage::kLoad, dateNow()});
   std::string problem = "the plug-ins no longer register " + wanted.name;
   try {
-    loadPlugins(options.plugins);
+    loadSomePlugins(pluginsFor(wanted, options.plugins));
     for (const Diagnostic& one : catalogueOf(QZLab::defaultLab())) {
       if (one.name == wanted.name && one.experimentOnly == wanted.experimentOnly) found = one;
     }
@@ -342,15 +377,16 @@ IsolationOptions withoutFailed(IsolationOptions options, const std::vector<Faile
   return options;
 }
 
-Survey surveyPlugins(const IsolationOptions& options, WatchedSignals& signals,
-                     const std::function<bool(const Diagnostic&)>& isDescribed) {
+Survey surveyPlugins(const IsolationOptions& options, WatchedSignals& signals, const DiagnosticChoice& described) {
   Survey survey;
   std::vector<std::filesystem::path> plugins = options.plugins;
   while (!plugins.empty()) {
-    SurveyAttempt attempt(options, plugins, survey, isDescribed);
+    SurveyAttempt attempt(options, plugins, survey, described);
     if (attempt.perform(signals)) break;
+    if (!attempt.failedPlugin()) continue;
+    survey.catalogue.clear();  // an earlier attempt may have found what that plug-in registers
     // What is not among the plug-ins that were named is a plug-in's own invention.
-    if (attempt.failedPlugin() && std::erase(plugins, *attempt.failedPlugin()) == 0) plugins.clear();
+    if (std::erase(plugins, *attempt.failedPlugin()) == 0) plugins.clear();
   }
   return survey;
 }

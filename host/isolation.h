@@ -41,15 +41,19 @@ struct Survey {
   bool interrupted = false;
 };
 
-// Loads the plug-ins in a process of their own and asks what is in them; only that for which `isDescribed` holds is
-// asked for its description. A plug-in that ends its process while it is loaded is left out and told in `failed`; what
-// ends its process while it is described has that as its description's error. Throws the Refusals of loadPlugins.
-Survey surveyPlugins(const IsolationOptions& options, WatchedSignals& signals,
-                     const std::function<bool(const Diagnostic&)>& isDescribed);
+// Chooses from a catalogue.
+using DiagnosticChoice = std::function<std::vector<Diagnostic>(const std::vector<Diagnostic>& catalogue)>;
 
-// As runDiagnostic, in a process of its own in which the plug-ins are loaded anew. Whatever ends that process before
-// its time becomes a Failed event of the stage it was in, and there is no DiagnosticCompleted then. What it writes to
-// its standard output and error stream become log lines. False when the user interrupted it.
+// Loads the plug-ins in a process of their own and asks what is in them; only what `described` chooses is asked for its
+// description. A plug-in that ends its process while it is loaded is left out and told in `failed`; what
+// ends its process while it is described has that as its description's error. Throws the Refusals of loadPlugins and of
+// `described`, which is called in that process.
+Survey surveyPlugins(const IsolationOptions& options, WatchedSignals& signals, const DiagnosticChoice& described);
+
+// As runDiagnostic, in a process of its own, which loads the plug-ins that the diagnostic needs, and no others where
+// they are known. Whatever ends that process before its time becomes a Failed event of the stage it was in, and there
+// is no DiagnosticCompleted then. What it writes to its standard output and error stream become log lines. False when
+// the user interrupted it.
 //
 // `result`, if it is not null, is analysed, and no experiment is run.
 bool runIsolated(const IsolationOptions& options, WatchedSignals& signals, const Diagnostic& diagnostic,

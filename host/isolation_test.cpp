@@ -34,11 +34,13 @@ std::string textOf(const DiagnosticErrorPtr& error) {
   return error->domain() + " " + std::to_string(error->code()) + " " + error->localizedDescription();
 }
 
+std::vector<Diagnostic> everything(const std::vector<Diagnostic>& catalogue) { return catalogue; }
+
 class IsolationTest : public testing::Test {
  protected:
   Survey survey(const std::vector<std::string>& plugins) {
     for (const std::string& name : plugins) options_.plugins.push_back(plugin(name));
-    return surveyPlugins(options_, signals_, [](const Diagnostic&) { return true; });
+    return surveyPlugins(options_, signals_, everything);
   }
 
   static std::vector<std::string> namesIn(const Survey& survey) {
@@ -77,11 +79,37 @@ TEST_F(SurveyTest, TellsWhatThePluginsHaveWithoutLoadingThemHere) {
 
 TEST_F(SurveyTest, AsksOnlyForTheDescriptionsThatAreWanted) {
   options_.plugins = {plugin("working")};
-  const Survey some = surveyPlugins(options_, signals_, [](const Diagnostic& one) { return one.name == "Fake.Two"; });
+  const Survey some = surveyPlugins(options_, signals_, [](const std::vector<Diagnostic>& catalogue) {
+    return std::vector<Diagnostic>{catalogue[1]};
+  });
   EXPECT_EQ(some.catalogue.size(), 9U);
   EXPECT_EQ(some.catalogue[0].description.experiment.summary(), "");
   EXPECT_EQ(some.catalogue[1].description.experiment.summary(), "Measures what it is told to.");
   EXPECT_EQ(some.catalogue[3].description.error, nullptr);
+  for (std::size_t i = 0; i < some.catalogue.size(); ++i) EXPECT_EQ(some.catalogue[i].description.isAsked, i == 1) << i;
+}
+
+TEST_F(SurveyTest, ThrowsTheRefusalsOfTheChoice) {
+  options_.plugins = {plugin("working")};
+  const auto refuse = [](const std::vector<Diagnostic>&) -> std::vector<Diagnostic> {
+    throw Refusal(ExitCode::kUsage, "not that");
+  };
+  EXPECT_THROW(surveyPlugins(options_, signals_, refuse), Refusal);
+}
+
+TEST_F(SurveyTest, TellsWhichPluginsADiagnosticNeeds) {
+  const Survey all = survey({"working", "combining", "experiments"});
+  const auto pluginsOf = [&all](const std::string& name) {
+    for (const DescribedDiagnostic& one : all.catalogue) {
+      if (one.diagnostic.name == name) return one.diagnostic.plugins;
+    }
+    return std::vector<std::filesystem::path>();
+  };
+  EXPECT_THAT(pluginsOf("Fake.One"), ElementsAre(plugin("working")));
+  EXPECT_THAT(pluginsOf("FakeExperiment"), ElementsAre(plugin("working")));
+  EXPECT_THAT(pluginsOf("Combined"), ElementsAre(plugin("working"), plugin("combining")));
+  EXPECT_THAT(pluginsOf("Combining.Own"), ElementsAre(plugin("combining")));
+  EXPECT_THAT(pluginsOf("Alone.Images"), ElementsAre(plugin("experiments")));
 }
 
 TEST_F(SurveyTest, ThrowsTheRefusalsOfTheLoader) {
@@ -122,7 +150,7 @@ TEST_F(SurveyTest, EndsALoadingThatTakesTooLong) {
 TEST_F(SurveyTest, LeavesOutAPluginThatWritesToItsProcessConnection) {
   constexpr const char* kDescribed =
       R"(={"says":"described","description":{"experiment":{"summary":"","parameters":[]},)"
-      R"("analysis":{"summary":"","parameters":[]},"error":null}})";
+      R"("analysis":{"summary":"","parameters":[]},"error":null,"isAsked":true}})";
   constexpr const char* kLines[] = {
       "=garbage", "=5", R"(={"says":5})", R"(={"says":"strange"})", R"(={"says":"catalogue","catalogue":[{}]})",
       kDescribed,
@@ -130,7 +158,7 @@ TEST_F(SurveyTest, LeavesOutAPluginThatWritesToItsProcessConnection) {
   options_.plugins = {plugin("fatal")};
   for (const char* line : kLines) {
     const EnvironmentVariable way("FATAL_PLUGIN", line);
-    const Survey none = surveyPlugins(options_, signals_, [](const Diagnostic&) { return true; });
+    const Survey none = surveyPlugins(options_, signals_, everything);
     ASSERT_EQ(none.failed.size(), 1U) << line;
     EXPECT_THAT(textOf(none.failed[0].error),
                 testing::EndsWith("closed or overwrote its process' connection to quazor"))
@@ -243,6 +271,28 @@ TEST_F(RunTest, AnalysesAResult) {
   EXPECT_EQ(run("working", "Fake.One", {"minimum=8"}, &result).verdict, Verdict::kFail);
 }
 
+TEST_F(RunTest, LoadsOnlyThePluginsThatTheDiagnosticNeeds) {
+  const Survey all = survey({"working", "combining"});
+  const auto runNow = [&](const std::string& name, const std::vector<std::string>& plugins) {
+    options_.plugins.clear();
+    for (const std::string& one : plugins) options_.plugins.push_back(plugin(one));
+    RecordBuilder builder;
+    builder.take(beginningOf(name));
+    for (const DescribedDiagnostic& one : all.catalogue) {
+      if (one.diagnostic.name != name) continue;
+      const BoundParameters parameters = bindParameters(one, {}, {parseSetting("experiment.duration=1")});
+      runIsolated(options_, signals_, one.diagnostic, parameters, runOptions_, nullptr, progress_, builder);
+    }
+    for (const RunEvent& event : builder.ending(momentAt(99))) builder.take(event);
+    return textOf(builder.takeRecord().error);
+  };
+  EXPECT_EQ(runNow("Fake.One", {"fatal", "working", "combining"}), "");
+  // Its plug-in has another diagnostic, with a half that is not loaded.
+  EXPECT_EQ(runNow("Combining.Own", {"fatal", "working", "combining"}), "");
+  EXPECT_EQ(runNow("Combined", {"fatal", "working", "combining"}), "");
+  EXPECT_EQ(runNow("Combined", {"combining"}), "QuazorHostErrorDomain 3 the plug-ins no longer register Combined");
+}
+
 TEST_F(RunTest, FailsWhenThePluginsNoLongerHaveTheDiagnostic) {
   EXPECT_EQ(textOf(run("working", "Fake.Three").error),
             "QuazorHostErrorDomain 3 the plug-ins no longer register Fake.Three");
@@ -283,6 +333,16 @@ TEST_F(RunTest, TurnsEachEndOfItsProcessIntoAFailureOfTheStage) {
     EXPECT_EQ(record.stages.size(), 4U) << row.name;
     EXPECT_EQ(logOf(record)[0], "an error line") << row.name;
   }
+}
+
+TEST_F(RunTest, EndsAPluginThatWritesALineWithoutEndToTheConnection) {
+  const DiagnosticRecord record = run("unruly", "Unruly", {"way=15"});  // it may take longer than runUnruly lets it
+  EXPECT_EQ(textOf(record.error),
+            "QuazorHostErrorDomain 9 the stage run of Unruly wrote more than 64 MiB in one line of its process' "
+            "connection to quazor");
+  EXPECT_EQ(record.errorStage, Stage::kRun);
+  EXPECT_FALSE(isCompleted_);
+  EXPECT_EQ(logOf(record)[0], "an error line");
 }
 
 TEST_F(RunTest, HasNoPassWhenThePluginSaysThatAllIsDone) {

@@ -7,6 +7,7 @@
 
 #include <algorithm>
 #include <cstdlib>
+#include <iterator>
 #include <sstream>
 
 namespace quazor {
@@ -69,8 +70,9 @@ std::string noteOfUndescribed(const std::vector<DescribedDiagnostic>& diagnostic
 }
 
 void checkEntry(const Profile& profile, const ProfileEntry& entry, const std::vector<DescribedDiagnostic>& matched) {
-  const bool allDescribed = std::all_of(
-      matched.begin(), matched.end(), [](const DescribedDiagnostic& one) { return one.description.error == nullptr; });
+  const bool allDescribed = std::all_of(matched.begin(), matched.end(), [](const DescribedDiagnostic& one) {
+    return one.description.isAsked && one.description.error == nullptr;
+  });
   if (!allDescribed) return;
   for (const Half half : kHalves) {
     const std::vector<std::string> names = declaredNames(matched, half);
@@ -83,21 +85,55 @@ void checkEntry(const Profile& profile, const ProfileEntry& entry, const std::ve
   }
 }
 
+// What of the catalogue an entry of diagnostics, or one of experiments, fits.
+std::vector<DescribedDiagnostic> matchesOf(const ProfileEntry& entry, const std::vector<DescribedDiagnostic>& catalogue,
+                                           bool ofExperiments) {
+  std::vector<DescribedDiagnostic> matched;
+  for (const DescribedDiagnostic& one : catalogue) {
+    const bool fits = matchesName(entry.name, one.diagnostic.name);
+    if (fits && one.diagnostic.experimentOnly == ofExperiments) matched.push_back(one);
+  }
+  return matched;
+}
+
+// True when each parameter that the entry sets is declared by one of the diagnostics.
+bool declareAll(const std::vector<DescribedDiagnostic>& diagnostics, const ProfileEntry& entry) {
+  for (const Half half : kHalves) {
+    const std::vector<std::string> names = declaredNames(diagnostics, half);
+    for (const auto& [name, ignored] : entry.values(half)) {
+      if (!contains(names, name)) return false;
+    }
+  }
+  return true;
+}
+
+// Adds those of the matches that are in doubt.
+void addDoubts(const ProfileEntry& entry, const std::vector<DescribedDiagnostic>& matched,
+               std::vector<Diagnostic>& doubts) {
+  std::vector<DescribedDiagnostic> asked;
+  std::copy_if(matched.begin(), matched.end(), std::back_inserter(asked),
+               [](const DescribedDiagnostic& one) { return one.description.isAsked; });
+  const auto couldNot = [](const DescribedDiagnostic& one) { return one.description.error != nullptr; };
+  // Without one that is asked, the entry does not matter; with one whose parameters are not known, it is passed over.
+  if (asked.empty() || std::any_of(asked.begin(), asked.end(), couldNot) || declareAll(asked, entry)) return;
+  for (const DescribedDiagnostic& one : matched) {
+    if (!one.description.isAsked && !contains(doubts, one.diagnostic)) doubts.push_back(one.diagnostic);
+  }
+}
+
 // Checks the entries of diagnostics or those of experiments.
 void checkEntries(const Profile& profile, const std::vector<ProfileEntry>& entries,
                   const std::vector<DescribedDiagnostic>& catalogue, bool ofExperiments, bool allMustExist) {
   for (const ProfileEntry& entry : entries) {
-    std::vector<DescribedDiagnostic> matched;
-    std::vector<std::string> names;
-    for (const DescribedDiagnostic& one : catalogue) {
-      if (one.diagnostic.experimentOnly != ofExperiments) continue;
-      names.push_back(one.diagnostic.name);
-      if (matchesName(entry.name, one.diagnostic.name)) matched.push_back(one);
-    }
+    const std::vector<DescribedDiagnostic> matched = matchesOf(entry, catalogue, ofExperiments);
     if (!matched.empty()) {
       checkEntry(profile, entry, matched);
     } else if (allMustExist) {
       const std::string noun = ofExperiments ? "experiment" : "diagnostic";
+      std::vector<std::string> names;
+      for (const DescribedDiagnostic& one : catalogue) {
+        if (one.diagnostic.experimentOnly == ofExperiments) names.push_back(one.diagnostic.name);
+      }
       throw Refusal(ExitCode::kCannotRead, "the profile '" + profile.file.string() + "' has an entry '" + entry.name +
                                                "', which fits no " + noun + didYouMean(entry.name, names));
     }
@@ -174,6 +210,13 @@ Dictionary dictionaryOf(const std::vector<BoundParameter>& parameters) {
 void checkProfile(const Profile& profile, const std::vector<DescribedDiagnostic>& catalogue, bool allMustExist) {
   checkEntries(profile, profile.entries, catalogue, false, allMustExist);
   checkEntries(profile, profile.experiments, catalogue, true, allMustExist);
+}
+
+std::vector<Diagnostic> inDoubt(const Profile& profile, const std::vector<DescribedDiagnostic>& catalogue) {
+  std::vector<Diagnostic> doubts;
+  for (const ProfileEntry& entry : profile.entries) addDoubts(entry, matchesOf(entry, catalogue, false), doubts);
+  for (const ProfileEntry& entry : profile.experiments) addDoubts(entry, matchesOf(entry, catalogue, true), doubts);
+  return doubts;
 }
 
 void checkSettings(const std::vector<Setting>& settings, const std::vector<DescribedDiagnostic>& selected) {

@@ -185,6 +185,53 @@ TEST(CheckProfile, RefusesAParameterThatNoDiagnosticOfTheEntryTakes) {
   EXPECT_EQ(check(R"({"B*": {"experiment": {"anything": 3}}})"), "accepted");
 }
 
+TEST(CheckProfile, PassesOverAnEntryForSomethingThatWasNotDescribed) {
+  DescribedDiagnostic other = diagnosticWith("Sync.Front", {}, {});
+  other.description.isAsked = false;
+  const auto check = [&other](const std::string& diagnostics) {
+    return refusalOf(ExitCode::kCannotRead, [&] { checkProfile(profileWith(diagnostics), {sync(), other}, true); });
+  };
+  EXPECT_EQ(check(R"({"Sync.*": {"experiment": {"gain": 3}}})"), "accepted");
+  EXPECT_EQ(check(R"({"Sync.Front": {"experiment": {"gain": 3}}})"), "accepted");
+  EXPECT_THAT(check(R"({"Sync.Back": {"experiment": {"gain": 3}}})"), HasSubstr("sets 'gain'"));
+}
+
+TEST(InDoubt, IsWhatMightDeclareAParameterThatNothingDescribedDeclares) {
+  DescribedDiagnostic other = diagnosticWith("Sync.Front", {}, {});
+  other.description.isAsked = false;
+  DescribedDiagnostic alone = imagesAlone();
+  DescribedDiagnostic otherAlone = imagesAlone();
+  otherAlone.diagnostic.name = "Images.More";
+  otherAlone.description = {};
+  otherAlone.description.isAsked = false;
+  const std::vector<DescribedDiagnostic> catalogue = {sync(), other, undescribed(), alone, otherAlone};
+  struct Row {
+    const char* name;
+    const char* diagnostics;
+    const char* experiments;
+    std::vector<std::string> doubts;
+  };
+  const Row rows[] = {
+      {"a parameter that is declared", R"({"Sync.*": {"experiment": {"duration": 3}}})", "{}", {}},
+      {"one that is not", R"({"Sync.*": {"experiment": {"gain": 3}}})", "{}", {"Sync.Front"}},
+      {"one of the other half", R"({"Sync.*": {"analysis": {"duration": 3}}})", "{}", {"Sync.Front"}},
+      {"two such entries",
+       R"({"Sync.*": {"experiment": {"gain": 3}}, "S*": {"experiment": {"gain": 3}}})",
+       "{}",
+       {"Sync.Front"}},
+      {"an entry for nothing that is asked", R"({"Sync.Front": {"experiment": {"gain": 3}}})", "{}", {}},
+      {"an entry for all, of which one cannot be described", R"({"*": {"experiment": {"gain": 3}}})", "{}", {}},
+      {"an experiment's parameter", "{}", R"({"Images*": {"gain": 3}})", {"Images.More"}},
+      {"an experiment's parameter that is declared", "{}", R"({"Images*": {"images": 3}})", {}},
+  };
+  for (const Row& row : rows) {
+    const Profile profile =
+        parseProfile("some.json", std::string(R"({"schema": 1, "diagnostics": )") + row.diagnostics +
+                                      R"(, "experiments": )" + row.experiments + "}");
+    EXPECT_EQ(namesOf(inDoubt(profile, catalogue)), row.doubts) << row.name;
+  }
+}
+
 TEST(CheckProfile, RefusesAnEntryThatFitsNoDiagnosticOnlyWhenAllMustExist) {
   const Profile profile = profileWith(R"({"Sync.Bakc": {"experiment": {"duration": 3}}})");
   EXPECT_EQ(

@@ -50,12 +50,6 @@ bool isSameFile(const std::filesystem::path& a, const std::filesystem::path& b) 
   return std::filesystem::equivalent(a, b, ignored);
 }
 
-// `last` is the position after the file's last registration.
-struct LoadedPlugin {
-  std::filesystem::path file;
-  std::size_t last;
-};
-
 std::vector<std::string> namesOf(const QZLab& lab, QZLab::Kind kind) {
   std::vector<std::string> names;
   for (const QZLab::Registration& registration : lab.registrations()) {
@@ -85,10 +79,8 @@ void checkDiagnostics(const std::vector<LoadedPlugin>& plugins) {
   }
 }
 
-}  // namespace
-
-void loadPlugins(const std::vector<std::filesystem::path>& files,
-                 const std::function<void(const std::filesystem::path& file)>& isNext) {
+std::vector<LoadedPlugin> loadEach(const std::vector<std::filesystem::path>& files,
+                                   const std::function<void(const std::filesystem::path& file)>& isNext) {
   std::vector<LoadedPlugin> loaded;
   for (const std::filesystem::path& file : files) {
     const bool again = std::any_of(loaded.begin(), loaded.end(),
@@ -98,8 +90,19 @@ void loadPlugins(const std::vector<std::filesystem::path>& files,
     loadPlugin(file);
     loaded.push_back({file, QZLab::defaultLab().registrations().size()});
   }
-  checkDiagnostics(loaded);
+  return loaded;
 }
+
+}  // namespace
+
+std::vector<LoadedPlugin> loadPlugins(const std::vector<std::filesystem::path>& files,
+                                      const std::function<void(const std::filesystem::path& file)>& isNext) {
+  std::vector<LoadedPlugin> loaded = loadEach(files, isNext);
+  checkDiagnostics(loaded);
+  return loaded;
+}
+
+void loadSomePlugins(const std::vector<std::filesystem::path>& files) { loadEach(files, nullptr); }
 
 std::optional<int> contractVersionIn(std::string_view linkerMessage) {
   // The mangled name of the contract's namespace: 6quazor, the next name's length, contract_, the version.

@@ -339,10 +339,12 @@ Json diagnosticJson(const Diagnostic& diagnostic) {
           {"experiment", losslessText(diagnostic.experimentName)},
           {"analysis", losslessText(diagnostic.analysisName)},
           {"experimentOnly", diagnostic.experimentOnly},
-          {"usedBy", textsJson(diagnostic.usedBy)}};
+          {"usedBy", textsJson(diagnostic.usedBy)},
+          {"plugins", textsJson({diagnostic.plugins.begin(), diagnostic.plugins.end()})}};
 }
 
 Diagnostic diagnosticFrom(const Json& json) {
+  const std::vector<std::string> plugins = textsAt(json, "plugins");
   return {textAt(json, "name"),
           textAt(json, "summary"),
           textAt(json, "experiment"),
@@ -350,18 +352,20 @@ Diagnostic diagnosticFrom(const Json& json) {
           nullptr,
           nullptr,
           get<bool>(json, "experimentOnly"),
-          textsAt(json, "usedBy")};
+          textsAt(json, "usedBy"),
+          {plugins.begin(), plugins.end()}};
 }
 
 Json descriptionJson(const DiagnosticDescription& description) {
   return {{"experiment", halfJson(description.experiment)},
           {"analysis", halfJson(description.analysis)},
-          {"error", losslessError(description.error)}};
+          {"error", losslessError(description.error)},
+          {"isAsked", description.isAsked}};
 }
 
 DiagnosticDescription descriptionFrom(const Json& json) {
   return {halfFrom(memberOf(json, "experiment")), halfFrom(memberOf(json, "analysis")),
-          errorFrom(memberOf(json, "error"))};
+          errorFrom(memberOf(json, "error")), get<bool>(json, "isAsked")};
 }
 
 }  // namespace quazor

@@ -222,7 +222,7 @@ TEST(EventFrom, RefusesAParameterWithAValueFromNowhere) {
 }
 
 TEST(DiagnosticFrom, ReadsADiagnosticBackWithoutItsFactories) {
-  const Diagnostic diagnostic{"N\xff", "S", "E", "A", nullptr, nullptr, true, {"U", "V"}};
+  const Diagnostic diagnostic{"N\xff", "S", "E", "A", nullptr, nullptr, true, {"U", "V"}, {"a/p.so", "q\xff.so"}};
   const Diagnostic read = diagnosticFrom(Json::parse(diagnosticJson(diagnostic).dump()));
   EXPECT_EQ(read.name, diagnostic.name);
   EXPECT_EQ(read.summary, "S");
@@ -232,6 +232,7 @@ TEST(DiagnosticFrom, ReadsADiagnosticBackWithoutItsFactories) {
   EXPECT_EQ(read.makeAnalysis, nullptr);
   EXPECT_TRUE(read.experimentOnly);
   EXPECT_EQ(read.usedBy, diagnostic.usedBy);
+  EXPECT_EQ(read.plugins, diagnostic.plugins);
   EXPECT_THROW(diagnosticFrom(Json::parse(R"({"name":"N"})")), BadRecord);
 }
 
@@ -249,6 +250,9 @@ TEST(DescriptionFrom, ReadsADescriptionBack) {
   EXPECT_FALSE(read.experiment.parameters().find("a")->required());
   EXPECT_TRUE(isSame(read.error, description.error));
   EXPECT_EQ(descriptionFrom(descriptionJson({})).error, nullptr);
+  EXPECT_TRUE(read.isAsked);
+  description.isAsked = false;
+  EXPECT_FALSE(descriptionFrom(descriptionJson(description)).isAsked);
   EXPECT_THROW(descriptionFrom(Json::parse(R"({"experiment":{}})")), BadRecord);
 }
 

@@ -36,20 +36,48 @@ std::vector<Diagnostic> wantedOf(const std::vector<Diagnostic>& catalogue, const
   return selectDiagnostics(catalogue, wanted, names);
 }
 
-std::vector<Profile> profilesOf(const Options& options, const Installation& installation,
-                                const std::vector<DescribedDiagnostic>& catalogue) {
+std::vector<Profile> profilesOf(const Options& options, const Installation& installation) {
   std::vector<Profile> profiles;
   if (!options.withoutProfile) {
-    // The installed profile may have entries for plug-ins that are not loaded now; a file that was named may not.
-    const bool named = !options.profile.empty();
-    profiles.push_back(readProfile(named ? options.profile : installation.defaultProfile()));
-    checkProfile(profiles.back(), catalogue, named);
+    profiles.push_back(readProfile(options.profile.empty() ? installation.defaultProfile() : options.profile));
   }
-  for (const std::filesystem::path& file : options.parameterFiles) {
-    profiles.push_back(readProfile(file));
-    checkProfile(profiles.back(), catalogue, true);
-  }
+  for (const std::filesystem::path& file : options.parameterFiles) profiles.push_back(readProfile(file));
   return profiles;
+}
+
+// Asks for the descriptions without which the profiles cannot be checked.
+void describeDoubts(const Options& options, const Installation& installation, const std::vector<Profile>& profiles,
+                    std::vector<DescribedDiagnostic>& catalogue) {
+  std::vector<Diagnostic> doubts;
+  for (const Profile& profile : profiles) {
+    const std::vector<Diagnostic> more = inDoubt(profile, catalogue);
+    doubts.insert(doubts.end(), more.begin(), more.end());
+  }
+  if (doubts.empty()) return;
+  if (options.inProcess) {  // where they are loaded already
+    for (DescribedDiagnostic& one : catalogue) {
+      if (contains(doubts, one.diagnostic)) one.description = describeDiagnostic(one.diagnostic);
+    }
+    return;
+  }
+  const Survey survey =
+      surveyOf(options, installation, [&doubts](const std::vector<Diagnostic>& /*catalogue*/) { return doubts; });
+  for (DescribedDiagnostic& one : catalogue) {
+    for (const DescribedDiagnostic& asked : survey.catalogue) {
+      if (asked.description.isAsked && contains({asked.diagnostic}, one.diagnostic))
+        one.description = asked.description;
+    }
+  }
+}
+
+void checkProfiles(const Options& options, const std::vector<Profile>& profiles,
+                   const std::vector<DescribedDiagnostic>& catalogue) {
+  // The installed profile may have entries for plug-ins that are not loaded now; a file that was named may not.
+  bool mayNameOthers = !options.withoutProfile && options.profile.empty();
+  for (const Profile& profile : profiles) {
+    checkProfile(profile, catalogue, !mayNameOthers);
+    mayNameOthers = false;
+  }
 }
 
 }  // namespace
@@ -60,32 +88,38 @@ IsolationOptions isolationOf(const Options& options, const Installation& install
   return isolation;
 }
 
-Survey surveyOf(const Options& options, const Installation& installation,
-                const std::function<bool(const Diagnostic&)>& isDescribed) {
+Survey surveyOf(const Options& options, const Installation& installation, const DiagnosticChoice& described) {
   const IsolationOptions isolation = isolationOf(options, installation);
   Survey survey;
   if (options.inProcess) {
     loadPlugins(isolation.plugins);
-    for (const Diagnostic& one : catalogueOf(QZLab::defaultLab())) {
-      survey.catalogue.push_back({one, isDescribed(one) ? describeDiagnostic(one) : DiagnosticDescription()});
-    }
+    const std::vector<Diagnostic> catalogue = catalogueOf(QZLab::defaultLab());
+    const std::vector<Diagnostic> wanted = described(catalogue);
+    for (const Diagnostic& one : catalogue) survey.catalogue.push_back({one, describeIfWanted(one, wanted)});
     return survey;
   }
   WatchedSignals signals;
-  survey = surveyPlugins(isolation, signals, isDescribed);
+  survey = surveyPlugins(isolation, signals, described);
   if (survey.interrupted) throw Refusal(ExitCode::kInterrupted, "interrupted while the plug-ins were loaded");
   return survey;
 }
 
+Survey surveyForSelection(const Options& options, const Installation& installation) {
+  return surveyOf(options, installation,
+                  [&options](const std::vector<Diagnostic>& catalogue) { return wantedOf(catalogue, options, true); });
+}
+
 Selection select(const Options& options, const Installation& installation) {
-  Survey survey = surveyOf(options, installation, [](const Diagnostic& /*one*/) { return true; });
-  const std::vector<DescribedDiagnostic>& described = survey.catalogue;
+  Survey survey = surveyForSelection(options, installation);
+  std::vector<DescribedDiagnostic>& described = survey.catalogue;
   std::vector<Diagnostic> catalogue;
   catalogue.reserve(described.size());
   for (const DescribedDiagnostic& one : described) catalogue.push_back(one.diagnostic);
 
   const std::vector<Diagnostic> wanted = wantedOf(catalogue, options, !survey.failed.empty());
-  const std::vector<Profile> profiles = profilesOf(options, installation, described);
+  const std::vector<Profile> profiles = profilesOf(options, installation);
+  describeDoubts(options, installation, profiles, described);
+  checkProfiles(options, profiles, described);
   std::vector<Setting> settings = settingsOfEnvironment();
   settings.insert(settings.end(), options.settings.begin(), options.settings.end());
   std::vector<DescribedDiagnostic> selected;

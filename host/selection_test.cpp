@@ -143,6 +143,63 @@ TEST_F(SelectionTest, RefusesWhatIsWrongWithParameters) {
   EXPECT_THAT(refusal(ExitCode::kUsage), HasSubstr("QUAZOR_SET 'measurd=1'"));
 }
 
+TEST_F(SelectionTest, AsksOnlyWhatIsSelectedForItsDescription) {
+  struct Row {
+    const char* name;
+    Command command;
+    std::vector<std::string> names;
+  };
+  const Row rows[] = {
+      {"a diagnostic", Command::kRun, {"Unruly"}},
+      {"an experiment", Command::kExperiment, {"UnrulyExperiment"}},
+      {"a description", Command::kDescribe, {"Unruly"}},
+      {"a description by a pattern", Command::kDescribe, {"Unr*"}},
+  };
+  // Whoever asks the other one ends the process, which becomes an error.
+  options_.plugins = {plugin("undescribable"), plugin("unruly")};
+  for (const Row& row : rows) {
+    options_.command = row.command;
+    options_.names = row.names;
+    std::vector<std::string> asked;
+    const Installation installation(directory_.path() / "bin" / "quazor");
+    const std::vector<DescribedDiagnostic> all = surveyForSelection(options_, installation).catalogue;
+    for (const DescribedDiagnostic& one : all) {
+      if (one.description.isAsked) asked.push_back(one.diagnostic.name);
+    }
+    EXPECT_THAT(asked, ElementsAre(row.command == Command::kExperiment ? "UnrulyExperiment" : "Unruly")) << row.name;
+    EXPECT_EQ(selectNow().diagnostics.size(), 1U) << row.name;
+  }
+  options_.all = true;
+  options_.names.clear();
+  options_.command = Command::kRun;
+  const Selection selection = selectNow();
+  ASSERT_EQ(selection.diagnostics.size(), 2U);
+  EXPECT_NE(selection.diagnostics[0].described.description.error, nullptr);
+  EXPECT_EQ(selection.diagnostics[1].described.description.error, nullptr);
+}
+
+TEST_F(SelectionTest, AsksWhatElseAnEntryFitsBeforeItRefusesAParameter) {
+  options_.plugins = {plugin("working"), plugin("unruly")};
+  options_.names = {"Fake.One"};
+  const auto withEntry = [this](const char* text) { options_.parameterFiles = {directory_.write("p.json", text)}; };
+  const std::string only = profileText(R"({"Fake.*": {"experiment": {"way": 1}}})");
+  withEntry(only.c_str());
+  EXPECT_THAT(refusal(ExitCode::kCannotRead), HasSubstr("sets 'way', which no experiment of 'Fake.*' takes"));
+  const std::string wide = profileText(R"({"[FU]*[!x]": {"experiment": {"way": 1}}})");
+  withEntry(wide.c_str());
+  EXPECT_THAT(selected(), ElementsAre("Fake.One"));
+  // In a copy of this process: what is loaded stays.
+  const pid_t child = ::fork();
+  if (child == 0) {
+    options_.inProcess = true;
+    const bool isAccepted = selected().size() == 1;
+    ::_exit(isAccepted ? 0 : 1);
+  }
+  int status = -1;
+  ASSERT_EQ(::waitpid(child, &status, 0), child);
+  EXPECT_EQ(status, 0);
+}
+
 TEST_F(SelectionTest, GoesOnWithoutAPluginThatCannotBeLoaded) {
   options_.plugins = {plugin("fatal"), plugin("working")};
   options_.names = {"Fake.One", "Fatal.One", "Fatal.*"};

@@ -37,7 +37,7 @@ class Selftest {
   Selftest(const Options& options, const Installation& installation, Console& console)
       : options_(withAllPlugins(options, installation)),
         installation_(installation),
-        survey_(surveyOf(options_, installation, [](const Diagnostic& /*one*/) { return true; })),
+        survey_(surveyOf(options_, installation, [](const std::vector<Diagnostic>& all) { return all; })),
         isolation_(withoutFailed(isolationOf(options_, installation), survey_.failed)),
         progress_(console.showsProgress ? &console.err : nullptr) {
     profile_ = readProfile(installation.defaultProfile());

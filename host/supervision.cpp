@@ -20,19 +20,25 @@ constexpr std::chrono::milliseconds kTick = 100ms;
 constexpr std::chrono::milliseconds kGrace = 500ms;
 // How long a killed process is waited for: one that is stuck in the kernel does not end.
 constexpr std::chrono::seconds kLongestDeath = 5s;
-constexpr std::size_t kLongestEvent = 1U << 30;
 constexpr std::size_t kLongestOutput = 1U << 16;
 
-// Cuts what is read from a descriptor into lines; one that is longer than `longest`, in bytes, is cut too.
+// Cuts what is read from a descriptor into lines. One that is longer than `longest`, in octets, is cut too or, with
+// kRefuse, dropped: reading is over then.
 class LineReader {
  public:
-  LineReader(int descriptor, std::size_t longest) : descriptor_(descriptor), longest_(longest) {}
+  enum class LongLines { kCut, kRefuse };
+
+  LineReader(int descriptor, std::size_t longest, LongLines longLines)
+      : descriptor_(descriptor), longest_(longest), longLines_(longLines) {}
 
   int descriptor() const { return descriptor_; }
   // True when nothing more will come.
   bool atEnd() const { return atEnd_; }
+  // True when a line was too long and was dropped.
+  bool hasRefused() const { return hasRefused_; }
 
-  // Reads what there is, up to a bound, and hands its lines on until `take` returns false. Returns that.
+  // Reads what there is, up to a bound, and hands its lines on until `take` returns false, or a line is refused.
+  // Returns that.
   template <class Take>
   bool read(Take&& take) {
     std::array<char, 65536> octets;
@@ -67,7 +73,8 @@ class LineReader {
     }
     text_.erase(0, begin);
     if (goOn && text_.size() > longest_) {
-      goOn = take(text_);
+      hasRefused_ = longLines_ == LongLines::kRefuse;
+      goOn = !hasRefused_ && take(text_);
       text_.clear();
     }
     searched_ = text_.size();
@@ -76,9 +83,11 @@ class LineReader {
 
   const int descriptor_;
   const std::size_t longest_;
+  const LongLines longLines_;
   std::string text_;
   std::size_t searched_ = 0;  // there is no end of a line before
   bool atEnd_ = false;
+  bool hasRefused_ = false;
 };
 
 class Supervisor {
@@ -87,8 +96,8 @@ class Supervisor {
       : child_(child),
         signals_(signals),
         supervision_(supervision),
-        connection_(child.connectionDescriptor(), kLongestEvent),
-        output_(child.outputDescriptor(), kLongestOutput),
+        connection_(child.connectionDescriptor(), kLongestEvent, LineReader::LongLines::kRefuse),
+        output_(child.outputDescriptor(), kLongestOutput, LineReader::LongLines::kCut),
         requestsBefore_(signals.requestsToEnd()) {}
 
   Supervised run() {
@@ -134,7 +143,7 @@ class Supervisor {
     } else if (signals_.requestsToEnd() > requestsBefore_) {
       beginEnding(SupervisionEnd::kInterrupted, now);
     } else if (isBad_) {
-      beginEnding(SupervisionEnd::kConnectionLost, now);
+      beginEnding(endOfBadConnection(), now);
     } else if (connection_.atEnd()) {
       // A process that ends closes its connection a moment before.
       how_ = SupervisionEnd::kConnectionLost;
@@ -143,6 +152,10 @@ class Supervisor {
     } else if (now >= supervision_.deadline()) {
       beginEnding(SupervisionEnd::kDeadline, now);
     }
+  }
+
+  SupervisionEnd endOfBadConnection() const {
+    return connection_.hasRefused() ? SupervisionEnd::kLineTooLong : SupervisionEnd::kConnectionLost;
   }
 
   void beginEnding(SupervisionEnd how, Moment now) {
@@ -167,7 +180,7 @@ class Supervisor {
     child_.signalGroup(SIGKILL);
     readAll();
     // It ended by itself after it had written what is no line; what came then has not been taken.
-    if (isBad_ && how_ == SupervisionEnd::kEnded && !child_.end()->bySignal) how_ = SupervisionEnd::kConnectionLost;
+    if (isBad_ && how_ == SupervisionEnd::kEnded && !child_.end()->bySignal) how_ = endOfBadConnection();
     if (!output_.rest().empty()) supervision_.takeOutput(output_.rest());
   }
 

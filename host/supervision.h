@@ -4,12 +4,16 @@
 #include "host/child_process.h"
 
 #include <chrono>
+#include <cstddef>
 #include <functional>
 #include <optional>
 #include <string>
 #include <string_view>
 
 namespace quazor {
+
+// The longest line of the connection, in octets; a few more may come.
+inline constexpr std::size_t kLongestEvent = std::size_t{64} << 20U;
 
 // What is to be done with what a child says. All are called on the watching thread.
 struct Supervision {
@@ -32,6 +36,7 @@ enum class SupervisionEnd {
   kDeadline,        // it was ended at the deadline
   kInterrupted,     // it was ended because this process was asked to end
   kConnectionLost,  // it was ended because it had closed the connection, or had written what is no line of it
+  kLineTooLong,     // it was ended because it had written a line of more than kLongestEvent octets to it
 };
 
 struct Supervised {

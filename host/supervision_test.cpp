@@ -52,7 +52,7 @@ class SupervisionTest : public testing::Test {
     ChildProcess child(signals_, body, std::nullopt);
     const Supervised end = supervise(child, signals_, supervision_);
     took_ = steady_clock::now() - begin;
-    constexpr const char* kHow[] = {"ended", "deadline", "interrupted", "connection lost"};
+    constexpr const char* kHow[] = {"ended", "deadline", "interrupted", "connection lost", "line too long"};
     return std::string(kHow[static_cast<int>(end.how)]) + ", " + (end.end ? textOf(*end.end) : "alive");
   }
 
@@ -249,6 +249,33 @@ TEST_F(SupervisionTest, EndsAChildThatWritesWhatIsNoLineOfItAndTakesNoMoreOfIt) 
             }),
             "connection lost, signal 15 (SIGTERM)");
   EXPECT_THAT(lines_, ElementsAre("one", "garbage"));
+}
+
+TEST_F(SupervisionTest, EndsAChildThatWritesALineWithoutEndAndTakesNoMoreOfIt) {
+  std::size_t written = 0;
+  supervision_.takeOutput = [&written](std::string_view line) { written = std::stoul(std::string(line)); };
+  EXPECT_EQ(run([](int connection) {
+              say(connection, "one\n");
+              const std::string piece(1 << 16, 'x');
+              for (std::size_t i = 0; i <= kLongestEvent; i += piece.size()) say(connection, piece);
+              say(STDOUT_FILENO, std::to_string(kLongestEvent) + "\n");
+              hang();
+            }),
+            "line too long, signal 15 (SIGTERM)");
+  EXPECT_THAT(lines_, ElementsAre("one"));
+  EXPECT_EQ(written, std::size_t{64} * 1024 * 1024);
+}
+
+TEST_F(SupervisionTest, TellsOfALineWithoutEndOfAChildThatHasEnded) {
+  EXPECT_EQ(run([](int connection) { say(connection, std::string(kLongestEvent + 1, 'x')); }),
+            "line too long, exit code 0");
+  EXPECT_THAT(lines_, IsEmpty());
+}
+
+TEST_F(SupervisionTest, TakesTheLongestLineOfTheConnection) {
+  EXPECT_EQ(run([](int connection) { say(connection, std::string(kLongestEvent, 'x') + "\n"); }), "ended, exit code 0");
+  ASSERT_EQ(lines_.size(), 1U);
+  EXPECT_EQ(lines_[0].size(), kLongestEvent);
 }
 
 TEST_F(SupervisionTest, EndsTheChildWhenThisProcessIsAskedToEnd) {

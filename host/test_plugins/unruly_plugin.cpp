@@ -57,6 +57,8 @@ void goWrong(int way) {
     case 14:
       for (int i = 0; i < 100; ++i) std::printf("%s\n", std::string(60'000, 'x').c_str());
       break;
+    case 15:
+      for (;;) tell(std::string(1'000'000, 'x'));
     default: break;
   }
   std::fflush(stdout);

@@ -1,6 +1,9 @@
 // A plug-in whose diagnostics misbehave when they are described.
 #include "tests/misbehaving/misbehaviour.h"
 
+#include <fcntl.h>
+#include <unistd.h>
+
 #include <cstdlib>
 #include <stdexcept>
 
@@ -8,14 +11,15 @@ namespace quazor::misbehaving {
 
 namespace {
 
-// True from the moment that "First" is described: a host that describes everything comes to it before the others.
-bool firstIsDescribed = false;
+// The file that the environment names is made by the first process that comes here.
+void crashInTheNextProcess() {
+  const int file = ::open(std::getenv("MISBEHAVIOUR_STATE"), O_CREAT | O_EXCL | O_CLOEXEC, 0600);
+  if (file < 0) crash();
+  ::close(file);
+}
 
 [[gnu::constructor]] void registerAll() {
-  addDiagnostic("First", {.inDescription = [] { firstIsDescribed = true; }});
-  addDiagnostic("CrashWhenRunIsDescribed", {.inDescription = [] {
-                  if (!firstIsDescribed) crash();
-                }});
+  addDiagnostic("CrashWhenRunIsDescribed", {.inDescription = crashInTheNextProcess});
   addDiagnostic("CrashWhenDescribed", {.inDescription = crash});
   addDiagnostic("ExitWhenDescribed", {.inDescription = [] { std::exit(0); }});
   addDiagnostic("ThrowWhenDescribed", {.inDescription = [] { throw std::runtime_error("the lamp is out"); }});

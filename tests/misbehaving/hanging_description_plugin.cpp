@@ -1,4 +1,4 @@
-// A plug-in whose diagnostic never ends its description. It is alone, as hosts describe all that a plug-in has.
+// A plug-in whose diagnostic never ends its description.
 #include "tests/misbehaving/misbehaviour.h"
 
 namespace quazor::misbehaving {
