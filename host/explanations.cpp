@@ -1,6 +1,6 @@
 #include "host/explanations.h"
 
-#include "backends/simulated/json_cursor.h"
+#include "backends/json/json_cursor.h"
 #include "frame/message_format.h"
 #include "host/catalogue.h"
 #include "host/exit_code.h"

@@ -24,7 +24,7 @@ import re
 import sys
 
 SUBSYSTEMS = ["camera_sync", "projector_fault", "report_channels", "sensor_images"]
-BACKENDS = ["backends/threads", "backends/simulated", "backends/linux"]
+BACKENDS = ["backends/json", "backends/threads", "backends/simulated", "backends/linux"]
 
 ALLOWED = {
     "frame": [],
@@ -33,9 +33,10 @@ ALLOWED = {
     "report_channels": ["frame", "platform"],
     "projector_fault": ["frame", "platform", "report_channels"],
     "sensor_images": ["frame", "platform"],
+    "backends/json": ["frame", "platform"],
     "backends/threads": ["frame", "platform"],
-    "backends/simulated": ["frame", "platform", "backends/threads"],
-    "backends/linux": ["frame", "platform"],
+    "backends/simulated": ["frame", "platform", "backends/json", "backends/threads"],
+    "backends/linux": ["frame", "platform", "backends/json", "backends/threads"],
     "host": ["frame", "platform", *BACKENDS],
     "examples": ["frame", "platform"],
     "tests": ["frame", "platform", *SUBSYSTEMS, *BACKENDS, "host"],

@@ -1,7 +1,7 @@
 // From a scenario's document to the scenario.
 #pragma once
 
-#include "backends/simulated/json_cursor.h"
+#include "backends/json/json_cursor.h"
 #include "backends/simulated/scenario.h"
 
 namespace quazor {

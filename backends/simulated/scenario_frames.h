@@ -1,8 +1,8 @@
 // The parts of a scenario's document that describe frames and report channels.
 #pragma once
 
+#include "backends/json/json_cursor.h"
 #include "backends/simulated/frame_traits.h"
-#include "backends/simulated/json_cursor.h"
 #include "backends/simulated/report_traits.h"
 
 #include <vector>

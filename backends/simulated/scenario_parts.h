@@ -1,8 +1,8 @@
 // What several parts of a scenario's document are made of.
 #pragma once
 
+#include "backends/json/json_cursor.h"
 #include "backends/simulated/fault.h"
-#include "backends/simulated/json_cursor.h"
 
 #include <cstdint>
 #include <string>

@@ -240,14 +240,14 @@ TEST_F(ScenarioReaderTest, DocumentsThatMeanNothingAreRefusedWithTheirPath) {
        "p.json: the document: there is no key \"zzz\"; known are \"$schema\", \"title\", \"base\", \"device\", "
        "\"cameras\", \"groups\", \"reports\", \"hidDevices\", \"display\", \"faults\", \"expect\"."},
       {"a key twice", with(R"("device": {"present": true, "present": false})"),
-       "p.json: device: the key \"present\" stands twice; leave one of the two."},
+       "p.json:2: device: the key \"present\" stands twice; leave one of the two."},
       {"a key twice at the top", with(R"("title": "again")"),
-       "p.json: the key \"title\" stands twice; leave one of the two."},
+       "p.json:2: the key \"title\" stands twice; leave one of the two."},
       {"a key twice in an array", withFault(R"("operation": "*", "action": "fail", "action": "hang")"),
-       "p.json: faults[0]: the key \"action\" stands twice; leave one of the two."},
+       "p.json:2: faults[0]: the key \"action\" stands twice; leave one of the two."},
       {"a number beyond a double", withCamera(R"("actualFrameRate": 1e999)"),
-       "p.json: cameras.a.actualFrameRate: the number is too large; a double must hold it."},
-      {"nested too deep", std::string(40, '['), "p.json: the document is nested more than 32 deep."},
+       "p.json:1: cameras.a.actualFrameRate: the number is too large; a double must hold it."},
+      {"nested too deep", std::string(40, '['), "p.json:1: the document is nested more than 32 deep."},
       {"a schema that is no name", with(R"("$schema": 1)"),
        "p.json: $schema: must be a string that is not empty, not 1."},
       {"a device that is no object", with(R"("device": true)"), "p.json: device: must be an object, not true."},
@@ -399,7 +399,7 @@ TEST_F(ScenarioReaderTest, FilesThatCannotBeReadAreRefused) {
   EXPECT_EQ(problemOf(folder_ / "absent.json"), "absent.json: there is no such file.");
   write("file", "{}");
   fs::create_directories(folder_ / "folder");
-  EXPECT_EQ(problemOf(folder_ / "folder"), "folder: this is a directory, not a scenario file.");
+  EXPECT_EQ(problemOf(folder_ / "folder"), "folder: this is a directory, not a file.");
   fs::create_symlink("loop.json", folder_ / "loop.json");
   EXPECT_EQ(problemOf(folder_ / "loop.json"), "loop.json: the file cannot be opened; check its permissions.");
   EXPECT_EQ(readScenario(folder_ / "absent.json", nullptr).has_value(), false);

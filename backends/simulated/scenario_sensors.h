@@ -1,9 +1,9 @@
 // The parts of a scenario's document that describe HID devices and the display.
 #pragma once
 
+#include "backends/json/json_cursor.h"
 #include "backends/simulated/display_traits.h"
 #include "backends/simulated/hid_traits.h"
-#include "backends/simulated/json_cursor.h"
 
 #include <string>
 

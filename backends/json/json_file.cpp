@@ -1,4 +1,4 @@
-#include "backends/simulated/json_file.h"
+#include "backends/json/json_file.h"
 
 #include <algorithm>
 #include <cstddef>
@@ -15,7 +15,7 @@ namespace {
 
 using Json = nlohmann::ordered_json;
 
-// Deeper than any scenario. Bounds the recursion of whoever walks the document.
+// Deeper than any document. Bounds the recursion of whoever walks the document.
 constexpr std::size_t kDeepest = 32;
 
 // The length of the UTF-8 sequence at the start of `text`; 0 when it is none (RFC 3629).
@@ -52,21 +52,59 @@ std::string lineAt(std::string_view text, std::size_t offset) {
   return std::to_string(std::ranges::count(before, '\n') + 1);
 }
 
+// How far the parser has come: it counts the ends of lines before the character that it took last, which is the last
+// one of what it tells of, or one beyond where that is a number.
+struct Progress {
+  std::size_t line = 1;
+  bool tookLineEnd = false;
+};
+
+// Hands a text to the parser, and tells the progress.
+class CountingIterator {
+ public:
+  using iterator_category = std::input_iterator_tag;
+  using value_type = char;
+  using difference_type = std::ptrdiff_t;
+  using pointer = const char*;
+  using reference = const char&;
+
+  CountingIterator(const char* at, Progress* progress) : at_(at), progress_(progress) {}
+
+  reference operator*() const { return *at_; }
+  CountingIterator& operator++() {
+    if (progress_->tookLineEnd) ++progress_->line;
+    progress_->tookLineEnd = *at_++ == '\n';
+    return *this;
+  }
+  bool operator==(const CountingIterator& other) const { return at_ == other.at_; }
+
+ private:
+  const char* at_;
+  Progress* progress_;
+};
+
 // Follows the parser through the document, to know where it stands and which keys an object has had.
 class Tracker {
  public:
   explicit Tracker(std::string name) : name_(std::move(name)) {}
 
-  bool operator()(Json::parse_event_t event, const Json& parsed) {
-    switch (event) {
-      case Json::parse_event_t::object_start: open(false); break;
-      case Json::parse_event_t::array_start: open(true); break;
-      case Json::parse_event_t::object_end:
-      case Json::parse_event_t::array_end: open_.pop_back(); break;
-      case Json::parse_event_t::key: key(parsed.get<std::string>()); break;
-      case Json::parse_event_t::value: element(); break;
-    }
-    return true;
+  // Parses, and calls `visit` wherever path() and line() may have changed.
+  template <typename Visit>
+  Json parse(std::string_view text, const Visit& visit) {
+    const auto follow = [&](int, Json::parse_event_t event, Json& parsed) {
+      take(event, parsed);
+      visit();
+      return true;
+    };
+    return Json::parse(CountingIterator(text.data(), &progress_),
+                       CountingIterator(text.data() + text.size(), &progress_), follow);
+  }
+
+  std::size_t line() const { return progress_.line; }
+  // "NAME:LINE: PATH: " or, in the document as a whole, "NAME:LINE: ".
+  std::string place() const {
+    const std::string where = path();
+    return name_ + ":" + std::to_string(line()) + ": " + (where.empty() ? "" : where + ": ");
   }
 
   std::string path() const {
@@ -86,13 +124,24 @@ class Tracker {
     std::set<std::string> keys;
   };
 
+  void take(Json::parse_event_t event, const Json& parsed) {
+    switch (event) {
+      case Json::parse_event_t::object_start: open(false); break;
+      case Json::parse_event_t::array_start: open(true); break;
+      case Json::parse_event_t::object_end:
+      case Json::parse_event_t::array_end: open_.pop_back(); break;
+      case Json::parse_event_t::key: key(parsed.get<std::string>()); break;
+      case Json::parse_event_t::value: element(); break;
+    }
+  }
   void element() {
     if (!open_.empty() && open_.back().isArray) ++open_.back().elements;
   }
   void open(bool isArray) {
     element();
     if (open_.size() == kDeepest) {
-      throw JsonProblem(name_ + ": the document is nested more than " + std::to_string(kDeepest) + " deep.");
+      throw JsonProblem(name_ + ":" + std::to_string(line()) + ": the document is nested more than " +
+                        std::to_string(kDeepest) + " deep.");
     }
     open_.push_back({isArray, 0, {}, {}});
   }
@@ -100,14 +149,13 @@ class Tracker {
     Container& object = open_.back();
     object.key.clear();
     if (!object.keys.insert(key).second) {
-      const std::string where = path();
-      throw JsonProblem(name_ + ": " + (where.empty() ? "" : where + ": ") + "the key " + Json(key).dump() +
-                        " stands twice; leave one of the two.");
+      throw JsonProblem(place() + "the key " + Json(key).dump() + " stands twice; leave one of the two.");
     }
     object.key = key;
   }
 
   std::string name_;
+  Progress progress_;
   std::vector<Container> open_;
 };
 
@@ -131,30 +179,38 @@ Json parseJson(std::string_view text, const std::string& name) {
     throw JsonProblem(name + ":" + lineAt(text, *invalid) + ": this is not UTF-8; save the file in that encoding.");
   }
   Tracker tracker(name);
-  const auto follow = [&](int, Json::parse_event_t event, Json& parsed) { return tracker(event, parsed); };
   try {
-    return Json::parse(text, follow);
+    return tracker.parse(text, [] {});
   } catch (const Json::parse_error& error) {
     const std::size_t offset = error.byte == 0 ? 0 : error.byte - 1;
     throw JsonProblem(name + ":" + lineAt(text, offset) + ": this is not JSON: " + complaintOf(error) + ".");
   } catch (const Json::out_of_range&) {
-    const std::string path = tracker.path();
-    throw JsonProblem(name + ": " + (path.empty() ? "" : path + ": ") +
-                      "the number is too large; a double must hold it.");
+    throw JsonProblem(tracker.place() + "the number is too large; a double must hold it.");
   }
 }
 
-Json readJsonFile(const std::filesystem::path& file) {
+std::size_t lineOfPath(std::string_view text, const std::string& path) {
+  Tracker tracker("");
+  std::size_t line = 0;
+  tracker.parse(text, [&] {
+    if (line == 0 && tracker.path() == path) line = tracker.line();
+  });
+  return std::max(line, std::size_t{1});
+}
+
+std::string readTextFile(const std::filesystem::path& file) {
   const std::string name = file.string();
   std::error_code failure;
   const std::filesystem::file_status status = std::filesystem::status(file, failure);
   if (status.type() == std::filesystem::file_type::not_found) throw JsonProblem(name + ": there is no such file.");
-  if (std::filesystem::is_directory(status)) throw JsonProblem(name + ": this is a directory, not a scenario file.");
+  if (std::filesystem::is_directory(status)) throw JsonProblem(name + ": this is a directory, not a file.");
   std::ifstream stream(file, std::ios::binary);
   if (!stream) throw JsonProblem(name + ": the file cannot be opened; check its permissions.");
-  const std::string text{std::istreambuf_iterator<char>(stream), {}};
+  std::string text{std::istreambuf_iterator<char>(stream), {}};
   if (stream.bad()) throw JsonProblem(name + ": the file cannot be read.");
-  return parseJson(text, name);
+  return text;
 }
+
+Json readJsonFile(const std::filesystem::path& file) { return parseJson(readTextFile(file), file.string()); }
 
 }  // namespace quazor

@@ -1,4 +1,4 @@
-#include "backends/simulated/json_cursor.h"
+#include "backends/json/json_cursor.h"
 
 #include <algorithm>
 #include <numeric>
@@ -46,9 +46,7 @@ std::string suggestion(std::string_view name, std::span<const std::string_view> 
   return "; known are " + known + ".";
 }
 
-void JsonCursor::fail(const std::string& sentence) const {
-  throw JsonProblem((path_.empty() ? "the document" : path_) + ": " + sentence);
-}
+void JsonCursor::fail(const std::string& sentence) const { throw JsonProblem(path_, sentence); }
 
 void JsonCursor::failType(const std::string& expected) const {
   fail("must be " + expected + ", not " + described(*value_) + ".");
@@ -61,7 +59,8 @@ const Json& JsonCursor::object() const {
 
 void JsonCursor::allowKeys(std::initializer_list<std::string_view> keys) const {
   for (const auto& [key, value] : object().items()) {
-    if (std::ranges::find(keys, key) == keys.end()) fail("there is no key " + inQuotes(key) + suggestion(key, keys));
+    if (std::ranges::find(keys, key) != keys.end()) continue;
+    throw JsonProblem(path_, "there is no key " + inQuotes(key) + suggestion(key, keys), jsonPath(path_, key));
   }
 }
 

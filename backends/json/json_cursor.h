@@ -1,7 +1,7 @@
 // JsonCursor: a value of a JSON document that knows where it stands.
 #pragma once
 
-#include "backends/simulated/json_file.h"
+#include "backends/json/json_file.h"
 #include "frame/value.h"
 
 #include <cstddef>
@@ -26,6 +26,7 @@ class JsonCursor {
 
   const std::string& path() const { return path_; }
   bool isNull() const { return value_->is_null(); }
+  bool isBoolean() const { return value_->is_boolean(); }
   bool isString() const { return value_->is_string(); }
   bool isObject() const { return value_->is_object(); }
   bool isArray() const { return value_->is_array(); }
