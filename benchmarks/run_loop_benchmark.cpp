@@ -110,6 +110,7 @@ void registerLoop(const std::string& name) {
 
 int main(int argc, char** argv) {
   quazor::registerLoop<quazor::QuazorLoop>("quazor");
+  quazor::registerLoop<quazor::DescriptorLoop>("quazor descriptors");
   quazor::registerLoop<quazor::GLibLoop>("glib");
   benchmark::Initialize(&argc, argv);
   if (benchmark::ReportUnrecognizedArguments(argc, argv)) return 2;

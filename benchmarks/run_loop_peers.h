@@ -1,6 +1,7 @@
-// The run loops that run_loop_benchmark compares: ours, and GLib's main loop.
+// The run loops that run_loop_benchmark compares: ours, those that also wait for descriptors, and GLib's main loop.
 #pragma once
 
+#include "backends/linux/descriptor_run_loop.h"
 #include "backends/threads/thread_run_loop.h"
 
 #include <glib.h>
@@ -14,19 +15,18 @@
 
 namespace quazor {
 
-// Sources with one handler on the loop of the thread that makes this. All calls on that thread, but signal and stop.
-class QuazorLoop {
+// Sources with one handler on a loop of the thread that makes this. All calls on that thread, but signal and stop.
+class LoopWithSources {
  public:
-  explicit QuazorLoop(const std::function<void()>& handler, std::size_t sources = 1)
-      : loop_(*ThreadRunLoops().currentRunLoop()) {
+  LoopWithSources(RunLoop& loop, const std::function<void()>& handler, std::size_t sources) : loop_(loop) {
     for (std::size_t i = 0; i < sources; ++i) {
       sources_.push_back(loop_.makeSource(handler));
       loop_.addSource(sources_.back(), kRunLoopDefaultMode);
     }
   }
-  QuazorLoop(const QuazorLoop&) = delete;
-  QuazorLoop& operator=(const QuazorLoop&) = delete;
-  ~QuazorLoop() {
+  LoopWithSources(const LoopWithSources&) = delete;
+  LoopWithSources& operator=(const LoopWithSources&) = delete;
+  ~LoopWithSources() {
     for (const auto& source : sources_) loop_.removeSource(source, kRunLoopDefaultMode);
   }
 
@@ -40,6 +40,18 @@ class QuazorLoop {
  private:
   RunLoop& loop_;
   std::vector<std::shared_ptr<RunLoopSource>> sources_;
+};
+
+class QuazorLoop : public LoopWithSources {
+ public:
+  explicit QuazorLoop(const std::function<void()>& handler, std::size_t sources = 1)
+      : LoopWithSources(*ThreadRunLoops().currentRunLoop(), handler, sources) {}
+};
+
+class DescriptorLoop : public LoopWithSources {
+ public:
+  explicit DescriptorLoop(const std::function<void()>& handler, std::size_t sources = 1)
+      : LoopWithSources(*makeLinuxRunLoops()->currentRunLoop(), handler, sources) {}
 };
 
 // The same with sources whose ready time is set: the cheapest signal that GLib has for a source that lasts.

@@ -90,6 +90,7 @@ RunLoopResult BasicRunLoop::runInMode(std::string_view name, std::chrono::nanose
   const Nesting nesting(stopped_);
   tell(mode, kRunLoopEntry);
   for (;;) {
+    waiter_->look();
     const bool handled = handleSources(mode);
     if (const auto reason = reasonToEnd(mode, deadline, handled && returnAfterSourceHandled)) {
       tell(mode, kRunLoopExit);

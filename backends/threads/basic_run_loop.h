@@ -30,6 +30,10 @@ class RunLoopWaiter {
   // Time since some moment: not negative, and it never goes back.
   // Thread: the loop's.
   virtual std::chrono::nanoseconds now() = 0;
+  // Signals the sources of what has happened elsewhere, where nobody calls this process for it. Called at the beginning
+  // of every round of a run; it must not wait.
+  // Thread: the loop's.
+  virtual void look() {}
   // Sleeps until `ready` holds or now() has reached `deadline`.
   // Thread: the loop's.
   virtual void wait(std::chrono::nanoseconds deadline, const std::function<bool()>& ready) = 0;

@@ -1,0 +1,39 @@
+// What a HID device says of itself in its report descriptor (USB HID 1.11, section 6.2.2).
+#pragma once
+
+#include <cstdint>
+#include <map>
+#include <optional>
+#include <span>
+#include <string>
+#include <vector>
+
+namespace quazor {
+
+// What a collection or a control is for, by the HID usage tables; page 0xFF00 and above are the vendors'.
+struct HidUsage {
+  std::uint16_t page = 0;
+  std::uint16_t usage = 0;
+
+  bool operator==(const HidUsage&) const = default;
+};
+
+struct HidReportDescriptor {
+  // The largest report that Linux takes, in bytes.
+  static constexpr std::uint32_t kLargestReport = 16384;
+
+  // One for each top-level collection, in their order; the first is the device's primary one. A collection without a
+  // usage has page 0, usage 0.
+  std::vector<HidUsage> topLevel;
+  // False: reports carry no ID, and what is said of report 0 holds for the only one.
+  bool numbered = false;
+  // The length of each report in bytes, with the byte of its ID where reports are numbered, by ID.
+  std::map<std::uint8_t, std::uint32_t> inputReports;
+  std::map<std::uint8_t, std::uint32_t> featureReports;
+};
+
+// Reads a report descriptor. Nothing when it is damaged; `problem`, which must not be null, then says in a few words
+// what is wrong with it, and where.
+std::optional<HidReportDescriptor> parseHidReportDescriptor(std::span<const std::uint8_t> bytes, std::string* problem);
+
+}  // namespace quazor

@@ -1,0 +1,39 @@
+// Any bytes as a report descriptor: what it says within its bounds, or a reason.
+#include "backends/linux/hid_report_descriptor.h"
+
+#include <cstddef>
+#include <cstdint>
+#include <cstdlib>
+#include <map>
+#include <optional>
+#include <string>
+
+namespace quazor {
+namespace {
+
+void require(bool holds) {
+  if (!holds) std::abort();
+}
+
+void requireReports(const HidReportDescriptor& descriptor, const std::map<std::uint8_t, std::uint32_t>& reports) {
+  const std::uint32_t id = descriptor.numbered ? 1 : 0;
+  for (const auto& [number, length] : reports) {
+    require(length >= id && length <= HidReportDescriptor::kLargestReport + id);
+    require(descriptor.numbered || number == 0);
+  }
+}
+
+}  // namespace
+}  // namespace quazor
+
+extern "C" int LLVMFuzzerTestOneInput(const std::uint8_t* data, std::size_t size) {
+  std::string problem;
+  const std::optional<quazor::HidReportDescriptor> descriptor =
+      quazor::parseHidReportDescriptor({data, size}, &problem);
+  quazor::require(descriptor.has_value() == problem.empty());
+  if (!descriptor) return 0;
+  quazor::require(descriptor->topLevel.size() <= size);
+  quazor::requireReports(*descriptor, descriptor->inputReports);
+  quazor::requireReports(*descriptor, descriptor->featureReports);
+  return 0;
+}
