@@ -2,6 +2,7 @@
 
 #include "frame/contract.h"
 #include "host/nearest_name.h"
+#include "host/phone.h"
 #include "host/table.h"
 
 #include <CLI/CLI.hpp>
@@ -22,6 +23,8 @@ constexpr const char* kExamples = R"(Examples:
   quazor run --all                                all of them, on the healthy phone
   quazor run CameraSyncDiagnostic.Back --set duration=10
   quazor run --all --phone my_phone.json --format json --output report.json
+  quazor phone probe                              what this machine has for a binding, and a first one
+  quazor run --all --phone linux:board.json       on this machine's own cameras, sensors and counters
   quazor run --all --record run.jsonl --output junit:report.xml --output ocp:report.jsonl
   quazor run --only failed                        what did not pass the last time
   quazor experiment CameraSyncExperiment.Back     what it measures, without judging it
@@ -36,7 +39,7 @@ constexpr const char* kExitCodes = R"(Exit codes:
   1    a diagnostic failed its limits; verify, diff or selftest found something
   2    a diagnostic or experiment ended in an error
   64   the command line is wrong
-  66   a plug-in, scenario, profile or record cannot be read or loaded
+  66   a plug-in, scenario, binding, profile or record cannot be read or loaded
   70   quazor itself failed
   73   a report or record cannot be written
   130  interrupted)";
@@ -160,8 +163,10 @@ void addRecord(CLI::App& command, RawOptions& raw) {
 void addRunOptions(CLI::App& command, RawOptions& raw, const std::string& what) {
   command.add_flag("--all", raw.all, "Run all " + what);
   command
-      .add_option("--phone", raw.phone, "Run on the phone of this scenario: a file, or the name of an installed one")
-      ->type_name("FILE");
+      .add_option("--phone", raw.phone,
+                  "Run on the phone of this scenario, or on this machine by this binding: a file, or the name of an "
+                  "installed one")
+      ->type_name("[linux:]FILE");
   command.add_flag("--realtime", raw.realTime, "Let the phone's time pass as real time does");
   command.add_option("--seed", raw.seed, "Choose the order of what happens at the same time; 0 by default")
       ->type_name("N");
@@ -235,6 +240,18 @@ ReportOptions reportOf(const RawOptions& raw, bool isOfRun) {
   return report;
 }
 
+// This machine is what it is: nothing chooses its time or its order of events.
+void checkPhone(const CLI::App& command, const std::filesystem::path& phone) {
+  const std::optional<std::filesystem::path> binding = bindingNamed(phone);
+  if (!binding) return;
+  if (binding->empty()) throw Refusal(ExitCode::kUsage, "--phone 'linux:': the binding's file or name is missing");
+  for (const char* option : {"--seed", "--realtime"}) {
+    if (command.get_option(option)->count() == 0) continue;
+    throw Refusal(ExitCode::kUsage, std::string(option) + " is for simulated phones; --phone '" + phone.string() +
+                                        "' is this machine, in real time, in the order in which things happen");
+  }
+}
+
 // Diagnostics or experiments: names, --all or --only failed.
 void checkNames(const Options& options, const std::string& what) {
   const int ways = (options.names.empty() ? 0 : 1) + (options.all ? 1 : 0) + (options.onlyFailed ? 1 : 0);
@@ -264,6 +281,7 @@ Options optionsOf(const CLI::App& command, const RawOptions& raw) {
   options.onlyFailed = raw.only == "failed";
   options.failedOf = raw.of;
   options.phone = raw.phone;
+  checkPhone(command, options.phone);
   options.realTime = raw.realTime;
   options.inProcess = raw.inProcess;
   options.seed = parseWhole("--seed", raw.seed, 0, UINT64_MAX);
@@ -354,6 +372,9 @@ void declareOtherCommands(CLI::App& app, RawOptions& raw) {
   addPlugins(selftest, raw);
   addReportOptions(selftest, raw, {"text", "json"});
   addProcessOptions(selftest, raw);
+  CLI::App& phone = *app.add_subcommand("phone", "Tell what this machine has for a binding, and print a first one");
+  phone.add_option("WHAT", raw.names, "probe")->type_name("")->required()->expected(1)->check(CLI::IsMember({"probe"}));
+  addRepeatable(phone, "--output", raw.outputs, "Write the binding to this file, and print only the rest", "FILE");
   CLI::App& completion = *app.add_subcommand("completion", "Print the completion for a shell: bash or zsh");
   completion.add_option("SHELL", raw.names, "bash or zsh")
       ->type_name("")

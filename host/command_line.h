@@ -28,16 +28,18 @@ enum class Command {
   kExplain,
   kDoctor,
   kSelftest,
+  kPhone,
   kCompletion
 };
 
 // In the order of the enumerators.
-inline constexpr std::string_view kCommandNames[] = {"list", "describe", "run",    "experiment", "verify",    "analyze",
-                                                     "diff", "explain",  "doctor", "selftest",   "completion"};
+inline constexpr std::string_view kCommandNames[] = {"list",   "describe", "run",   "experiment",
+                                                     "verify", "analyze",  "diff",  "explain",
+                                                     "doctor", "selftest", "phone", "completion"};
 
 // What a command line asks for. Options that its command does not have keep their defaults.
 struct Options {
-  std::vector<std::string> names;              // of diagnostics and experiments; what is to be explained; a shell
+  std::vector<std::string> names;  // of diagnostics and experiments; what is to be explained; a shell; probe
   std::vector<std::filesystem::path> plugins;  // none: the installed one
   std::vector<Setting> settings;
   std::vector<std::filesystem::path> parameterFiles;
@@ -45,7 +47,7 @@ struct Options {
   std::filesystem::path record;                // to be written; empty: none
   std::filesystem::path failedOf;              // the record that --only failed means; empty: that of the last run
   std::filesystem::path profile;               // empty: the installed one
-  std::filesystem::path phone;                 // empty: the installed healthy one
+  std::filesystem::path phone;                 // a scenario, or linux:BINDING; empty: the installed healthy one
   ReportOptions report;
   std::vector<DeadlineSetting> deadlines;
   std::optional<std::uint64_t> memory;  // of a process of a plug-in, in bytes; nothing: no limit

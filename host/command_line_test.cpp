@@ -194,6 +194,7 @@ TEST(ParseCommandLine, KnowsItsCommands) {
                       {{"explain", "206"}, Command::kExplain},
                       {{"doctor"}, Command::kDoctor},
                       {{"selftest"}, Command::kSelftest},
+                      {{"phone", "probe"}, Command::kPhone},
                       {{"completion", "bash"}, Command::kCompletion}};
   EXPECT_EQ(std::size(rows), std::size(kCommandNames));
   for (const Row& row : rows) {

@@ -6,6 +6,7 @@
 #include "host/doctor.h"
 #include "host/explain_command.h"
 #include "host/json_report.h"
+#include "host/phone_command.h"
 #include "host/record_commands.h"
 #include "host/run_command.h"
 #include "host/selection.h"
@@ -85,6 +86,7 @@ ExitCode perform(const Options& options, const Installation& installation, Conso
     case Command::kExplain: return explainErrors(options, installation, console);
     case Command::kDoctor: return doctorCommand(options, installation, console);
     case Command::kSelftest: return selftestCommand(options, installation, console);
+    case Command::kPhone: return phoneCommand(options, console);
     case Command::kCompletion: break;
   }
   console.out << completionScript(options.names.front()) << std::flush;

@@ -1,6 +1,7 @@
 #include "host/completion.h"
 
 #include "host/command_line.h"
+#include "host/phone.h"
 #include "host/selection.h"
 
 #include <algorithm>
@@ -64,7 +65,7 @@ class Completer {
     if (option == "--output") return {"text:", "json:", "csv:", "ocp:", "junit:"};
     if (option == "--log-level") return {"error", "default", "debug"};
     if (option == "--only") return {"failed"};
-    if (option == "--phone") return installation_.scenarioNames();
+    if (option == "--phone") return phones();
     if (option == "--deadline") {
       std::vector<std::string> stages;
       for (const Stage stage : kStages) stages.push_back(std::string(nameOf(stage)) + "=");
@@ -73,10 +74,17 @@ class Completer {
     return option == "--set" ? parameters() : std::vector<std::string>();
   }
 
+  std::vector<std::string> phones() const {
+    std::vector<std::string> names = installation_.scenarioNames();
+    for (const std::string& name : installation_.bindingNames()) names.push_back(std::string(kLinuxPrefix) + name);
+    return names;
+  }
+
   std::vector<std::string> operands() const {
     const std::string& command = words_.front();
     if (command == "selftest") return installation_.scenarioNames();
     if (command == "completion") return {"bash", "zsh"};
+    if (command == "phone") return {"probe"};
     std::vector<std::string> names;
     if (command != "run" && command != "describe" && command != "experiment" && command != "explain") return names;
     for (const DescribedDiagnostic& one : catalogue(false)) {

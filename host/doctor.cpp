@@ -98,10 +98,24 @@ class Doctor {
         tell(false, "phone", name, refusal.what());
       }
     }
+    checkBindings();
     check("backend", "real time (--realtime)", [&] {
       phonesOfScenario(installation_.defaultScenario(), true, 0)();
       return std::string("the healthy phone can be made");
     });
+  }
+
+  void checkBindings() {
+    const std::vector<std::string> names = installation_.bindingNames();
+    const std::string here = "this machine can be asked: quazor phone probe; ";
+    tell(true, "backend", "linux (--phone linux:FILE)", here + countText(names.size(), "binding") + " installed");
+    for (const std::string& name : names) {
+      try {
+        phonesOfBinding(installation_.binding(name));
+      } catch (const Refusal& refusal) {
+        tell(false, "binding", name, refusal.what());
+      }
+    }
   }
 
   void checkLastRun() {

@@ -48,14 +48,26 @@ std::filesystem::path Installation::defaultScenario() const { return data_ / "sc
 std::filesystem::path Installation::explanations() const { return data_ / "explanations"; }
 
 std::filesystem::path Installation::scenario(const std::filesystem::path& name) const {
+  return dataFile("scenarios", name);
+}
+
+std::vector<std::string> Installation::scenarioNames() const { return dataNames("scenarios"); }
+
+std::filesystem::path Installation::binding(const std::filesystem::path& name) const {
+  return dataFile("bindings", name);
+}
+
+std::vector<std::string> Installation::bindingNames() const { return dataNames("bindings"); }
+
+std::filesystem::path Installation::dataFile(const char* folder, const std::filesystem::path& name) const {
   if (isThere(name) || name.is_absolute()) return name;
-  std::filesystem::path installed = data_ / "scenarios" / name;
+  std::filesystem::path installed = data_ / folder / name;
   installed += ".json";
   return isThere(installed) ? installed : name;
 }
 
-std::vector<std::string> Installation::scenarioNames() const {
-  const std::filesystem::path directory = data_ / "scenarios";
+std::vector<std::string> Installation::dataNames(const char* folder) const {
+  const std::filesystem::path directory = data_ / folder;
   std::vector<std::string> names;
   std::error_code ignored;
   for (const auto& entry : std::filesystem::recursive_directory_iterator(directory, ignored)) {

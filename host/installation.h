@@ -27,8 +27,14 @@ class Installation {
   std::filesystem::path scenario(const std::filesystem::path& name) const;
   // All installed scenarios, by the names that scenario() knows, in their order.
   std::vector<std::string> scenarioNames() const;
+  // The same of the bindings that `--phone linux:NAME` means.
+  std::filesystem::path binding(const std::filesystem::path& name) const;
+  std::vector<std::string> bindingNames() const;
 
  private:
+  std::filesystem::path dataFile(const char* folder, const std::filesystem::path& name) const;
+  std::vector<std::string> dataNames(const char* folder) const;
+
   std::filesystem::path programDirectory_;
   std::filesystem::path plugins_;
   std::filesystem::path data_;

@@ -36,6 +36,15 @@ TEST_F(InstallationTest, FindsAnInstalledScenarioByItsName) {
   EXPECT_EQ(installation().scenario("sync/refused"), installed);
 }
 
+TEST_F(InstallationTest, FindsInstalledBindingsByTheirNames) {
+  const std::filesystem::path bindings = std::filesystem::path(QUAZOR_DATA_DIRECTORY) / "bindings";
+  const std::filesystem::path installed = directory_.write(bindings / "board.json", "{}");
+  directory_.write(bindings / "binding.schema.json", "{}");
+  EXPECT_EQ(installation().binding("board"), installed);
+  EXPECT_EQ(installation().binding("other"), "other");
+  EXPECT_EQ(installation().bindingNames(), std::vector<std::string>{"board"});
+}
+
 TEST_F(InstallationTest, PrefersAFileOfThatPathToAnInstalledScenario) {
   const std::filesystem::path file = directory_.write("mine", "{}");
   EXPECT_EQ(installation().scenario(file), file);

@@ -2,6 +2,7 @@
 
 #include "frame/message_format.h"
 #include "host/ocp_stream.h"
+#include "host/phone.h"
 #include "host/text_report.h"
 #include "host/unfinished.h"
 #include "host/value_json.h"
@@ -59,7 +60,7 @@ std::string commandOf(const RunBegan& run, const std::vector<std::string>& names
   for (const std::string& name : names) addWord(line, " ", name);
   for (const std::string& plugin : run.plugins) addWord(line, " --plugin ", plugin);
   if (!run.phone.empty()) addWord(line, " --phone ", run.phone);
-  line += " --seed " + std::to_string(run.seed);
+  if (!bindingNamed(run.phone)) line += " --seed " + std::to_string(run.seed);  // a real phone has none
   line += " --profile none";
   addSettings(line, "experiment", parameters.experiment);
   addSettings(line, "analysis", parameters.analysis);

@@ -1,5 +1,7 @@
 #include "host/phone.h"
 
+#include "backends/linux/linux_phone.h"
+#include "backends/linux/probe.h"
 #include "backends/simulated/scenario.h"
 #include "backends/simulated/simulated_phone.h"
 #include "host/exit_code.h"
@@ -31,11 +33,31 @@ class PhoneOfScenario final : public Phone {
   SimulatedPhone phone_;
 };
 
+// This machine. Nothing is wrong with it on purpose.
+class PhoneOfBinding final : public Phone {
+ public:
+  explicit PhoneOfBinding(const Binding& binding)
+      : capture_(makeLinuxCapture(binding)), platform_(linuxPlatform(binding, capture_)) {}
+
+  Platform platform() const override { return platform_; }
+  std::vector<DeclaredFault> faults() const override { return {}; }
+  std::uint64_t framesDelivered() const override { return capture_->framesDelivered(); }
+
+ private:
+  const std::shared_ptr<LinuxCapture> capture_;
+  const Platform platform_;
+};
+
+template <class Content>
+Content contentOf(std::optional<Content> content, const std::string& problem) {
+  if (!content) throw Refusal(ExitCode::kCannotRead, "the phone cannot be made: " + problem);
+  return *std::move(content);
+}
+
 Scenario read(const std::filesystem::path& file) {
   std::string problem;
   std::optional<Scenario> scenario = readScenario(file, &problem);
-  if (!scenario) throw Refusal(ExitCode::kCannotRead, "the phone cannot be made: " + problem);
-  return *std::move(scenario);
+  return contentOf(std::move(scenario), problem);
 }
 
 std::string_view nameOf(Expectation::Verdict verdict) {
@@ -57,6 +79,23 @@ std::optional<ExpectedError> expected(const std::optional<FaultError>& error) {
 PhoneMaker phonesOfScenario(const std::filesystem::path& file, bool realTime, std::uint64_t seed) {
   const PhoneTime time = realTime ? PhoneTime::kReal : PhoneTime::kVirtual;
   return [scenario = read(file), time, seed] { return std::make_unique<PhoneOfScenario>(scenario, time, seed); };
+}
+
+std::optional<std::filesystem::path> bindingNamed(const std::filesystem::path& phone) {
+  const std::string text = phone.string();
+  if (!text.starts_with(kLinuxPrefix)) return std::nullopt;
+  return text.substr(kLinuxPrefix.size());
+}
+
+PhoneMaker phonesOfBinding(const std::filesystem::path& file) {
+  std::string problem;
+  std::optional<Binding> binding = readBinding(file, &problem);
+  return [binding = contentOf(std::move(binding), problem)] { return std::make_unique<PhoneOfBinding>(binding); };
+}
+
+PhoneProbe probeThisMachine() {
+  MachineProbe probe = probeMachine(sourcesOfRunningSystem());
+  return {std::move(probe.lines), std::move(probe.binding)};
 }
 
 ScenarioSummary summaryOfScenario(const std::filesystem::path& file) {

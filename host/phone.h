@@ -12,6 +12,7 @@
 #include <memory>
 #include <optional>
 #include <string>
+#include <string_view>
 #include <vector>
 
 namespace quazor {
@@ -68,6 +69,23 @@ struct ScenarioSummary {
   std::vector<ExpectedOutcome> expected;
   bool hasFaults = false;
 };
+
+// A phone's name that begins so is the machine that quazor runs on; what follows names the binding file.
+inline constexpr std::string_view kLinuxPrefix = "linux:";
+
+// The FILE of "linux:FILE"; nothing for other names of phones, which are scenarios'.
+std::optional<std::filesystem::path> bindingNamed(const std::filesystem::path& phone);
+
+// Reads a binding file and gives the maker of this machine as a phone, which is always the same one, in real time.
+// Throws a Refusal (kCannotRead) with the reader's sentence when the file cannot be read.
+PhoneMaker phonesOfBinding(const std::filesystem::path& file);
+
+// What this machine has for a binding to name: for people, line by line, and a binding to start from, a file's text.
+struct PhoneProbe {
+  std::vector<std::string> lines;  // may hold any character that a device gives
+  std::string binding;
+};
+PhoneProbe probeThisMachine();
 
 // What a scenario file says of itself. Throws a Refusal (kCannotRead) when the file cannot be read.
 ScenarioSummary summaryOfScenario(const std::filesystem::path& file);

@@ -81,5 +81,45 @@ TEST(PhonesOfScenario, RefusesAScenarioThatCannotBeRead) {
   }
 }
 
+TEST(BindingNamed, IsTheFileAfterThePrefix) {
+  EXPECT_EQ(bindingNamed("linux:board.json"), "board.json");
+  EXPECT_EQ(bindingNamed("linux:"), "");
+  EXPECT_EQ(bindingNamed("linux"), std::nullopt);
+  EXPECT_EQ(bindingNamed("camera_sync/linux:board"), std::nullopt);
+  EXPECT_EQ(bindingNamed(""), std::nullopt);
+}
+
+TEST(PhonesOfBinding, AreThisMachine) {
+  const TestDirectory directory;
+  const PhoneMaker makePhone = phonesOfBinding(directory.write("board.json", R"({"title": "Nothing"})"));
+  const std::unique_ptr<Phone> phone = makePhone();
+  EXPECT_TRUE(phone->faults().empty());
+  EXPECT_EQ(phone->framesDelivered(), 0U);
+  const Platform platform = phone->platform();
+  DiagnosticErrorPtr error;
+  EXPECT_EQ(platform.capture->createPlugIn()->device(&error), nullptr);
+  ASSERT_NE(error, nullptr);
+  EXPECT_EQ(error->domain(), "LinuxErrorDomain");
+  EXPECT_NE(platform.reports->reportWithOnlySimpleChannels(nullptr), nullptr);
+}
+
+TEST(PhonesOfBinding, RefusesABindingThatCannotBeRead) {
+  const TestDirectory directory;
+  try {
+    phonesOfBinding(directory.write("bad.json", "{\n\"titel\": 1}"));
+    ADD_FAILURE() << "it was accepted";
+  } catch (const Refusal& refusal) {
+    EXPECT_EQ(refusal.code(), ExitCode::kCannotRead);
+    EXPECT_THAT(refusal.what(), testing::HasSubstr("bad.json:2: the document: there is no key \"titel\""));
+  }
+}
+
+TEST(ProbeThisMachine, GivesABindingThatCanBeRead) {
+  const TestDirectory directory;
+  const PhoneProbe probe = probeThisMachine();
+  EXPECT_FALSE(probe.lines.empty());
+  EXPECT_NO_THROW(phonesOfBinding(directory.write("probed.json", probe.binding)));
+}
+
 }  // namespace
 }  // namespace quazor

@@ -160,6 +160,19 @@ Options withFailedNames(Options options) {
   return options;
 }
 
+// The phone that the options mean, by its name in records.
+std::string choosePhone(const Options& options, const Installation& installation, PhoneMaker* makePhone) {
+  if (const auto binding = bindingNamed(options.phone)) {
+    const std::filesystem::path file = installation.binding(*binding);
+    *makePhone = phonesOfBinding(file);
+    return std::string(kLinuxPrefix) + file.string();
+  }
+  const std::filesystem::path scenario =
+      options.phone.empty() ? installation.defaultScenario() : installation.scenario(options.phone);
+  *makePhone = phonesOfScenario(scenario, options.realTime, options.seed);
+  return scenario.string();
+}
+
 }  // namespace
 
 ExitCode runCommand(const Options& given, const Installation& installation, Console& console) {
@@ -174,13 +187,11 @@ ExitCode runCommand(const Options& given, const Installation& installation, Cons
     requireParameters(one.described, one.parameters);
     jobs.push_back({std::move(one), nullptr, options.seed});
   }
-  const std::filesystem::path scenario =
-      options.phone.empty() ? installation.defaultScenario() : installation.scenario(options.phone);
   RunOptions runOptions;
-  runOptions.makePhone = phonesOfScenario(scenario, options.realTime, options.seed);
+  const std::string phone = choosePhone(options, installation, &runOptions.makePhone);
   runOptions.logLevel = options.logLevel.value_or(LogLevel::kDefault);
   RunBegan began = beginningOf(options, installation, jobs, selection.failed);
-  began.phone = scenario.string();
+  began.phone = phone;
   return perform(options, installation, console, std::move(began), jobs, selection.failed, runOptions);
 }
 
