@@ -1,0 +1,1 @@
+run all quazor run --all --format json

@@ -1,0 +1,37 @@
+#!/usr/bin/env python3
+"""Tests of kernel_trace.py."""
+
+import unittest
+
+from kernel_trace import read_trace
+
+TRACE = """\
+# tracer: nop
+#              | |         |   |||||     |         |
+          quazor-81      [000] .....     6.000100: sys_write(fd: 5, buf: 7ffd5c, count: 1f)
+          poll-1-83      [000] .....     6.010000: v4l2_dqbuf: minor = 3, index = 0, type = VIDEO_CAPTURE, sequence = 0
+          quazor-81      [000] .....     6.010500: sys_write(fd: 5, buf: 7ffd5c, count: 1f)
+  poll:camera 2-84       [000] d..1.     6.043000: v4l2_dqbuf: minor = 7, index = 1, type = VIDEO_CAPTURE, sequence = 0
+          poll-1-83      [000] .....     6.044000: v4l2_dqbuf: minor = 3, index = 1, type = VIDEO_CAPTURE, sequence = 1
+          quazor-81      [000] .....     9.000000: sys_write(fd: 5, buf: 7ffd5c, count: 20)
+          poll-1-83      [000] .....     9.000001: v4l2_dqbuf: minor = 3, index = 2, type = VIDEO_CAPTURE, sequence = 2
+          quazor-81      [000] .....     9.000200: sys_write(fd: 5, buf: 7ffd5c, count: 20)
+"""
+
+
+class KernelTraceTest(unittest.TestCase):
+    def test_dequeued_buffers_are_counted_for_each_node_until_a_moment(self):
+        trace = read_trace(TRACE)
+        self.assertEqual(trace.end_of_silence(), 9.0)
+        self.assertEqual(trace.count_before(3, 9.0), 2)
+        self.assertEqual(trace.count_before(7, 9.0), 1)
+        self.assertEqual(trace.count_before(3, 10.0), 3)
+        self.assertEqual(trace.count_before(4, 10.0), 0)
+
+    def test_a_trace_without_writes_has_no_end_of_silence(self):
+        with self.assertRaises(ValueError):
+            read_trace("").end_of_silence()
+
+
+if __name__ == "__main__":
+    unittest.main()

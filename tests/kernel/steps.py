@@ -1,0 +1,45 @@
+"""The steps, in the order in which they run: a script of guest/steps and a check of what it left."""
+
+import dataclasses
+import typing
+
+import checks_cameras as cameras
+import checks_host as host
+import checks_sensors as sensors
+
+
+@dataclasses.dataclass(frozen=True)
+class Step:
+    name: str  # of guest/steps/NAME.sh
+    shows: str
+    check: typing.Callable  # takes an Arrived; raises CheckFailed
+    boot: int = 1  # in which of the boots it runs
+    limit: int = 60  # seconds of guest time until it counts as hanging
+
+
+STEPS = [
+    Step("back_cameras", "three cameras pass; their frames are as the kernel counts them", cameras.back_cameras),
+    Step("front_cameras", "two cameras pass; their frames are as the kernel counts them", cameras.front_cameras),
+    Step("delayed_start", "a start that is 100 ms late is an offset of 3 frames", cameras.delayed_start),
+    Step("dropped_frames", "dropped frames are gaps; a camera without frames hangs nobody", cameras.dropped_frames),
+    Step("refused_reqbufs", "buffers are refused: error 204", cameras.refused_start("VIDIOC_REQBUFS")),
+    Step("refused_qbuf", "queueing a buffer is refused: error 204", cameras.refused_start("VIDIOC_QBUF")),
+    Step("refused_streamon", "the start is refused: error 204", cameras.refused_start("VIDIOC_STREAMON")),
+    Step("refused_qbuf_streaming", "queueing is refused in mid-stream: a stream error", cameras.refused_qbuf_streaming),
+    Step("disconnect", "a camera disconnects in mid-stream: counted", cameras.disturbed(DisconnectCount=1)),
+    Step("damaged_buffer", "a damaged buffer is counted, and is no frame", cameras.damaged_buffer),
+    Step("fatal_error", "a stream breaks down: counted", cameras.disturbed(StreamErrorCount=1)),
+    Step("unbind", "the driver is unbound in mid-stream, and bound again", cameras.unbind),
+    Step("two_users", "a second user of a camera is refused; the first goes on", cameras.two_users),
+    Step("nothing", "a machine without devices: a clear error each", host.nothing, boot=2),
+    Step("simulated_phone", "the simulated phone passes on this kernel", host.simulated_phone, boot=2),
+    Step("channels", "60 control groups are report channels; one raised, one missing", host.channels, boot=2),
+    Step("probe", "a probe lists what is there, also without rights", host.probe, boot=2),
+    Step("projector", "frames are lit, and the light is off afterwards", cameras.projector, boot=2),
+    Step("projector_unlit", "the light fails: error 206", cameras.projector_unlit, boot=2),
+    Step("projector_unsafe", "the light is off for safety: error 213", cameras.projector_unsafe, boot=2),
+    Step("projector_killed", "the light is off when a process is killed", cameras.projector_killed, boot=2),
+    Step("sensor_30s", "60 images a second for 30 s, without loss", sensors.sensor_30s, boot=2, limit=90),
+    Step("sensor_faults", "no sensor, two, silent, refusing, removed, pausing, with long reports", sensors.sensor_faults, boot=2),
+    Step("display_off", "no images while the display is dark or unplugged", sensors.display_off, boot=2),
+]
