@@ -152,7 +152,8 @@ void addLogOptions(CLI::App& command, RawOptions& raw) {
                   "in reports; without it, error is shown and default kept")
       ->type_name("LEVEL")
       ->check(CLI::IsMember({"error", "default", "debug"}));
-  command.add_flag("--system-log", raw.systemLog, "Send log lines to the system's log too");
+  command.add_flag("--system-log", raw.systemLog,
+                   "Send log lines to the system's journal too, or to syslog where there is none");
 }
 
 void addRecord(CLI::App& command, RawOptions& raw) {
@@ -334,7 +335,8 @@ void declareRunningCommands(CLI::App& app, RawOptions& raw) {
   const std::vector<std::string> formats = {"text", "json", "csv", "ocp", "junit"};
   CLI::App& run = *app.add_subcommand("run", "Run diagnostics: measure, and judge by limits");
   addNames(run, raw.names, "A diagnostic's");
-  run.add_option("--only", raw.only, "failed: run what did not pass in the last run, or in the record of --of")
+  run.add_option("--only", raw.only,
+                 "failed: run what did not pass in the last run, or in the record of --of, as it was run then")
       ->type_name("failed")
       ->check(CLI::IsMember({"failed"}));
   run.add_option("--of", raw.of, "The record that --only means")->type_name("RECORD");

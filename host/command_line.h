@@ -5,6 +5,7 @@
 #include "host/deadlines.h"
 #include "host/exit_code.h"
 #include "host/parameters.h"
+#include "host/profile.h"
 #include "host/run_report.h"
 
 #include <cstdint>
@@ -47,6 +48,7 @@ struct Options {
   std::filesystem::path record;                // to be written; empty: none
   std::filesystem::path failedOf;              // the record that --only failed means; empty: that of the last run
   std::filesystem::path profile;               // empty: the installed one
+  std::optional<Profile> recorded;             // the parameters of the run of which something is run again
   std::filesystem::path phone;                 // a scenario, or linux:BINDING; empty: the installed healthy one
   ReportOptions report;
   std::vector<DeadlineSetting> deadlines;

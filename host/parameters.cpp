@@ -78,7 +78,7 @@ void checkEntry(const Profile& profile, const ProfileEntry& entry, const std::ve
     const std::vector<std::string> names = declaredNames(matched, half);
     for (const auto& [name, ignored] : entry.values(half)) {
       if (contains(names, name)) continue;
-      throw Refusal(ExitCode::kCannotRead, "the profile '" + profile.file.string() + "' sets '" + name +
+      throw Refusal(ExitCode::kCannotRead, "the " + profile.kind + " '" + profile.file.string() + "' sets '" + name +
                                                "', which no " + std::string(nameOf(half)) + " of '" + entry.name +
                                                "' takes" + didYouMean(name, names));
     }
@@ -123,12 +123,12 @@ void addDoubts(const ProfileEntry& entry, const std::vector<DescribedDiagnostic>
 
 // Checks the entries of diagnostics or those of experiments.
 void checkEntries(const Profile& profile, const std::vector<ProfileEntry>& entries,
-                  const std::vector<DescribedDiagnostic>& catalogue, bool ofExperiments, bool allMustExist) {
+                  const std::vector<DescribedDiagnostic>& catalogue, bool ofExperiments) {
   for (const ProfileEntry& entry : entries) {
     const std::vector<DescribedDiagnostic> matched = matchesOf(entry, catalogue, ofExperiments);
     if (!matched.empty()) {
       checkEntry(profile, entry, matched);
-    } else if (allMustExist) {
+    } else if (!profile.mayNameOthers) {
       const std::string noun = ofExperiments ? "experiment" : "diagnostic";
       std::vector<std::string> names;
       for (const DescribedDiagnostic& one : catalogue) {
@@ -154,7 +154,7 @@ std::vector<BoundParameter> bindHalf(const DescribedDiagnostic& diagnostic, Half
       const Value* const value = findIn(profile, diagnostic.diagnostic, half, name);
       if (value == nullptr) continue;
       parameter.value = *value;
-      parameter.source = "profile " + profile.file.filename().string();
+      parameter.source = profile.kind + " " + profile.file.filename().string();
     }
     for (const SettingPlace place : {SettingPlace::kEnvironment, SettingPlace::kCommandLine}) {
       for (const Setting& setting : settings) {
@@ -207,9 +207,9 @@ Dictionary dictionaryOf(const std::vector<BoundParameter>& parameters) {
   return dictionary;
 }
 
-void checkProfile(const Profile& profile, const std::vector<DescribedDiagnostic>& catalogue, bool allMustExist) {
-  checkEntries(profile, profile.entries, catalogue, false, allMustExist);
-  checkEntries(profile, profile.experiments, catalogue, true, allMustExist);
+void checkProfile(const Profile& profile, const std::vector<DescribedDiagnostic>& catalogue) {
+  checkEntries(profile, profile.entries, catalogue, false);
+  checkEntries(profile, profile.experiments, catalogue, true);
 }
 
 std::vector<Diagnostic> inDoubt(const Profile& profile, const std::vector<DescribedDiagnostic>& catalogue) {

@@ -64,9 +64,9 @@ struct DescribedDiagnostic {
 };
 
 // Throws a Refusal (kCannotRead) for a profile's parameter that no diagnostic or experiment of its entry declares and,
-// if `allMustExist`, for an entry that fits none. An entry for something that was not described, or could not be, is
-// passed over.
-void checkProfile(const Profile& profile, const std::vector<DescribedDiagnostic>& catalogue, bool allMustExist);
+// unless the profile may name others, for an entry that fits none. An entry for something that was not described, or
+// could not be, is passed over.
+void checkProfile(const Profile& profile, const std::vector<DescribedDiagnostic>& catalogue);
 
 // What was not described, and might declare a parameter that an entry of the profile sets, while nothing described that
 // the entry fits declares it: before it is described, checkProfile cannot tell whether the entry is wrong.

@@ -142,9 +142,10 @@ TEST(CheckSettings, SpeaksOfWhatIsSelected) {
 
 TEST(CheckProfile, ChecksTheEntriesOfExperimentsAgainstExperiments) {
   const auto check = [](const std::string& experiments, bool allMustExist) {
-    const Profile profile =
+    Profile profile =
         parseProfile("some.json", R"({"schema": 1, "diagnostics": {}, "experiments": )" + experiments + "}");
-    return refusalOf(ExitCode::kCannotRead, [&] { checkProfile(profile, {sync(), imagesAlone()}, allMustExist); });
+    profile.mayNameOthers = !allMustExist;
+    return refusalOf(ExitCode::kCannotRead, [&] { checkProfile(profile, {sync(), imagesAlone()}); });
   };
   EXPECT_EQ(check(R"({"Im*": {"images": 5}})", true), "accepted");
   EXPECT_EQ(check(R"({"Images": {"image": 5}})", false),
@@ -174,7 +175,7 @@ TEST(CheckSettings, RefusesTwoSettingsOfOneParameter) {
 TEST(CheckProfile, RefusesAParameterThatNoDiagnosticOfTheEntryTakes) {
   const auto check = [](const std::string& diagnostics) {
     return refusalOf(ExitCode::kCannotRead, [&] {
-      checkProfile(profileWith(diagnostics), {sync(), fault(), undescribed()}, true);
+      checkProfile(profileWith(diagnostics), {sync(), fault(), undescribed()});
     });
   };
   EXPECT_EQ(
@@ -189,7 +190,7 @@ TEST(CheckProfile, PassesOverAnEntryForSomethingThatWasNotDescribed) {
   DescribedDiagnostic other = diagnosticWith("Sync.Front", {}, {});
   other.description.isAsked = false;
   const auto check = [&other](const std::string& diagnostics) {
-    return refusalOf(ExitCode::kCannotRead, [&] { checkProfile(profileWith(diagnostics), {sync(), other}, true); });
+    return refusalOf(ExitCode::kCannotRead, [&] { checkProfile(profileWith(diagnostics), {sync(), other}); });
   };
   EXPECT_EQ(check(R"({"Sync.*": {"experiment": {"gain": 3}}})"), "accepted");
   EXPECT_EQ(check(R"({"Sync.Front": {"experiment": {"gain": 3}}})"), "accepted");
@@ -233,11 +234,12 @@ TEST(InDoubt, IsWhatMightDeclareAParameterThatNothingDescribedDeclares) {
 }
 
 TEST(CheckProfile, RefusesAnEntryThatFitsNoDiagnosticOnlyWhenAllMustExist) {
-  const Profile profile = profileWith(R"({"Sync.Bakc": {"experiment": {"duration": 3}}})");
+  Profile profile = profileWith(R"({"Sync.Bakc": {"experiment": {"duration": 3}}})");
   EXPECT_EQ(
-      refusalOf(ExitCode::kCannotRead, [&] { checkProfile(profile, {sync()}, true); }),
+      refusalOf(ExitCode::kCannotRead, [&] { checkProfile(profile, {sync()}); }),
       "the profile 'dir/some.json' has an entry 'Sync.Bakc', which fits no diagnostic; did you mean 'Sync.Back'?");
-  EXPECT_EQ(refusalOf(ExitCode::kCannotRead, [&] { checkProfile(profile, {sync()}, false); }), "accepted");
+  profile.mayNameOthers = true;
+  EXPECT_EQ(refusalOf(ExitCode::kCannotRead, [&] { checkProfile(profile, {sync()}); }), "accepted");
 }
 
 TEST(BindParameters, LetsASettingWinOverTheProfile) {

@@ -36,6 +36,8 @@ struct Profile {
   std::filesystem::path file;
   std::vector<ProfileEntry> entries;        // of diagnostics, in the order of the file
   std::vector<ProfileEntry> experiments{};  // in the order of the file; their analysis is empty
+  std::string kind = "profile";             // what the file is, for people
+  bool mayNameOthers = false;               // an entry may be of a diagnostic that no loaded plug-in has
 
   // The value for a parameter, or null. The entry with the diagnostic's own name wins over patterns, and of two
   // patterns the later one; an entry that does not hold the parameter leaves it to the others.

@@ -302,9 +302,38 @@ class OnlyFailedTest(RecordTest):
 
     def test_what_passes_then_is_no_longer_among_them(self):
         self.assertEqual(self.run_fake("--set", "minimum=1", names=["Fake.*"], env=self.state).returncode, 1)
-        self.assertEqual(self.only_failed(duration=1).returncode, 0)
+        self.assertEqual(self.only_failed("--set", "minimum=0").returncode, 0)
         result = self.only_failed()
-        self.assertEqual((result.returncode, result.stdout), (0, "Everything passed in the last run.\n"))
+        self.assertEqual(result.returncode, 0, result.stderr)
+        self.assertTrue(result.stdout.startswith("Everything passed in the last run.\n"), result.stdout)
+
+    def test_what_is_asked_for_is_written_also_when_everything_passed(self):
+        self.run_names("Fake.One", code=0)
+        junit = self.directory / "run.xml"
+        result = self.only_failed("--format", "json", "--record", self.record, "--output", f"junit:{junit}")
+        self.assertEqual((result.returncode, result.stderr), (0, "Everything passed in the last run.\n"))
+        self.assertEqual(json.loads(result.stdout)["diagnostics"], [])
+        self.assertEqual(xml.etree.ElementTree.parse(junit).getroot().get("tests"), "0")
+        self.assert_verifies(self.record)
+        self.assert_refused(self.only_failed("--output", self.directory / "missing" / "a"), 73, "cannot be written")
+
+    def test_it_runs_as_it_was_run(self):
+        failing = ["--set", "measured=1", "--set", "minimum=90"]
+        self.assertEqual(self.run_fake(*failing, names=["Fake.One"], env=self.state).returncode, 1)
+        result = quazor("run", "--only", "failed", "--format", "json", "--record", self.record, env=self.state)
+        self.assertEqual(result.returncode, 1, result.stderr)
+        self.assertEqual(json.loads(result.stdout)["diagnostics"][0]["parameters"],
+                         {"experiment": {"duration": 1, "measured": 1}, "analysis": {"minimum": 90}})
+        self.assertEqual(events_in(self.record)[0]["phone"], str(self.phone))
+        result = quazor("run", "--only", "failed", "--set", "minimum=0", env=self.state)
+        self.assertEqual(result.returncode, 0, result.stderr)
+
+    def test_what_was_not_begun_runs_with_the_installed_profile(self):
+        self.run_fake(names=["Fake.One", "Fake.Two"], env=self.state)
+        last = pathlib.Path(self.state["XDG_STATE_HOME"]) / "quazor/last_run.jsonl"
+        last.write_text("".join(last.read_text().splitlines(keepends=True)[:1]))
+        result = quazor("run", "--only", "failed", env=self.state)
+        self.assert_refused(result, 64, "duration")  # which no profile sets
 
     def test_it_takes_a_record(self):
         self.recorded(code=2, names=["Fake.One", "Broken.Nothing"])

@@ -4,9 +4,9 @@
 #include "host/host_error.h"
 #include "host/interrupt_watcher.h"
 #include "host/isolation.h"
-#include "host/last_run.h"
 #include "host/output_file.h"
 #include "host/phone.h"
+#include "host/rerun.h"
 #include "host/run_events.h"
 #include "host/selection.h"
 #include "host/table.h"
@@ -141,23 +141,17 @@ ExitCode perform(const Options& options, const Installation& installation, Conso
   return events.exitCode();
 }
 
-// The options with the names of what did not pass in place of --only failed, and the plug-ins that they were in.
-Options withFailedNames(Options options) {
-  const std::filesystem::path record = options.failedOf.empty() ? lastRunFile() : options.failedOf;
-  if (record.empty() || (options.failedOf.empty() && !std::filesystem::exists(record))) {
-    throw Refusal(ExitCode::kCannotRead, "there is no record of a last run; --of RECORD names one");
-  }
-  const RecordedRun run = runIn(record);
-  for (const DiagnosticRecord& one : run.records) {
-    if (!one.experimentName.empty()) continue;  // it is no plug-in
-    throw Refusal(ExitCode::kCannotRead,
-                  "the plug-in " + one.name +
-                      " could not be loaded in that run, so what it holds was not run; name what "
-                      "is to be run, or give --all");
-  }
-  options.names = namesNotPassed(run);
-  if (options.plugins.empty()) options.plugins.assign(run.began.plugins.begin(), run.began.plugins.end());
-  return options;
+// There is nothing to run again, and what was asked for to be written says so.
+ExitCode performNothing(const Options& options, const Installation& installation, Console& console) {
+  checkOutputs(options);
+  const bool isForPeople = options.report.format == Format::kText || !options.report.output.empty();
+  (isForPeople ? console.out : console.err) << "Everything passed in the last run.\n" << std::flush;
+  RunEvents events(options, false, console);
+  RunBegan began = beginningOf(options, installation, {}, {});
+  began.phone = options.phone.string();
+  events.take(std::move(began));
+  events.take(RunEnded{std::nullopt, dateNow()});
+  return events.exitCode();
 }
 
 // The phone that the options mean, by its name in records.
@@ -176,11 +170,8 @@ std::string choosePhone(const Options& options, const Installation& installation
 }  // namespace
 
 ExitCode runCommand(const Options& given, const Installation& installation, Console& console) {
-  const Options options = given.onlyFailed ? withFailedNames(given) : given;
-  if (options.onlyFailed && options.names.empty()) {
-    console.out << "Everything passed in the last run.\n" << std::flush;
-    return ExitCode::kAllPassed;
-  }
+  const Options options = given.onlyFailed ? optionsToRunAgain(given) : given;
+  if (options.onlyFailed && options.names.empty()) return performNothing(options, installation, console);
   Selection selection = select(options, installation);
   std::vector<Job> jobs;
   for (BoundDiagnostic& one : selection.diagnostics) {

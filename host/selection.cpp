@@ -38,9 +38,12 @@ std::vector<Diagnostic> wantedOf(const std::vector<Diagnostic>& catalogue, const
 
 std::vector<Profile> profilesOf(const Options& options, const Installation& installation) {
   std::vector<Profile> profiles;
-  if (!options.withoutProfile) {
-    profiles.push_back(readProfile(options.profile.empty() ? installation.defaultProfile() : options.profile));
+  if (!options.withoutProfile && options.profile.empty()) {
+    profiles.push_back(readProfile(installation.defaultProfile()));
+    profiles.back().mayNameOthers = true;  // it is for whatever plug-ins may be loaded
   }
+  if (options.recorded) profiles.push_back(*options.recorded);
+  if (!options.withoutProfile && !options.profile.empty()) profiles.push_back(readProfile(options.profile));
   for (const std::filesystem::path& file : options.parameterFiles) profiles.push_back(readProfile(file));
   return profiles;
 }
@@ -67,16 +70,6 @@ void describeDoubts(const Options& options, const Installation& installation, co
       if (asked.description.isAsked && contains({asked.diagnostic}, one.diagnostic))
         one.description = asked.description;
     }
-  }
-}
-
-void checkProfiles(const Options& options, const std::vector<Profile>& profiles,
-                   const std::vector<DescribedDiagnostic>& catalogue) {
-  // The installed profile may have entries for plug-ins that are not loaded now; a file that was named may not.
-  bool mayNameOthers = !options.withoutProfile && options.profile.empty();
-  for (const Profile& profile : profiles) {
-    checkProfile(profile, catalogue, !mayNameOthers);
-    mayNameOthers = false;
   }
 }
 
@@ -119,7 +112,7 @@ Selection select(const Options& options, const Installation& installation) {
   const std::vector<Diagnostic> wanted = wantedOf(catalogue, options, !survey.failed.empty());
   const std::vector<Profile> profiles = profilesOf(options, installation);
   describeDoubts(options, installation, profiles, described);
-  checkProfiles(options, profiles, described);
+  for (const Profile& profile : profiles) checkProfile(profile, described);
   std::vector<Setting> settings = settingsOfEnvironment();
   settings.insert(settings.end(), options.settings.begin(), options.settings.end());
   std::vector<DescribedDiagnostic> selected;
