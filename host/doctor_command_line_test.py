@@ -1,0 +1,113 @@
+"""quazor doctor, on installations that are whole and on broken ones."""
+
+import os
+import pathlib
+import shutil
+import unittest
+
+import command_line_fixture
+from command_line_fixture import PLUGINS, PROGRAM, CommandLineTest, quazor
+
+STREAMING = PLUGINS / "streaming_plugin.so"
+DATA = ("scenarios", "bindings", "profiles", "explanations")
+
+
+class DoctorCase(CommandLineTest):
+    def setUp(self):
+        super().setUp()
+        self.state = self.directory / "state"
+
+    def doctor(self, *arguments, state=None):
+        """The exit code, and what is told of each thing: (is it fine, its kind and name, the finding)."""
+        result = quazor("doctor", *arguments, env={"XDG_STATE_HOME": str(state or self.state)})
+        self.assertEqual(result.stderr, "")
+        lines = result.stdout.splitlines()
+        self.assertEqual(len(lines) % 2, 0, result.stdout)
+        found = []
+        for head, finding in zip(lines[::2], lines[1::2]):
+            self.assertIn(head[:9], ("ok       ", "REFUSED  "))
+            self.assertTrue(finding.startswith(" " * 11), finding)
+            found.append((head.startswith("ok"), head[9:], finding[11:]))
+        return result.returncode, found
+
+    def assert_refused(self, outcome, what, why):
+        """That alone is refused, for this reason."""
+        code, found = outcome
+        self.assertEqual(code, 66)
+        refused = [(name, finding) for fine, name, finding in found if not fine]
+        self.assertEqual(len(refused), 1, refused)
+        self.assertIn(what, refused[0][0])
+        self.assertIn(why, refused[0][1])
+
+
+class DoctorTest(DoctorCase):
+    def test_a_whole_installation(self):
+        code, found = self.doctor()
+        self.assertEqual(code, 0, found)
+        self.assertTrue(all(fine for fine, _, _ in found))
+        findings = {name.rsplit("/", 1)[-1]: finding for _, name, finding in found}
+        self.assertEqual(findings["camera_sensor_diagnostics.so"], "4 diagnostics, 4 experiments")
+        self.assertEqual(findings["sensor_images.so"], "0 diagnostics, 1 experiment")
+        self.assertRegex(findings["backend simulated"], r"^the healthy phone can be made; \d+ phones installed$")
+        self.assertEqual(findings["last_run.jsonl"], "there was none")
+
+    def test_plug_ins_are_looked_at_one_by_one(self):
+        files = (PLUGINS / "fatal_plugin.so", STREAMING, self.phone, self.directory / "missing.so")
+        code, found = self.doctor(*(word for file in files for word in ("--plugin", file)))
+        self.assertEqual(code, 66)
+        plugins = {name.rsplit("/", 1)[-1]: (fine, finding) for fine, name, finding in found
+                   if name.startswith("plug-in ")}
+        self.assertEqual({name: fine for name, (fine, _) in plugins.items()},
+                         {"fatal_plugin.so": False, "streaming_plugin.so": True, "phone.json": False,
+                          "missing.so": False})
+        self.assertIn("crashed: its process was ended by signal", plugins["fatal_plugin.so"][1])
+        self.assertIn("is not a shared object", plugins["phone.json"][1])
+        self.assertIn("missing.so", plugins["missing.so"][1])
+
+    def test_a_plug_in_whose_diagnostics_cannot_be_described(self):
+        self.assert_refused(self.doctor("--plugin", PLUGINS / "undescribable_plugin.so"), "undescribable_plugin.so",
+                            "cannot be described")
+
+    def test_the_record_of_the_last_run(self):
+        self.assertEqual(self.run_fake("--set", "minimum=90", "--set", "measured=1",
+                                       env={"XDG_STATE_HOME": str(self.state)}).returncode, 1)
+        self.assertIn("1 diagnostic did not pass", [finding for _, _, finding in self.doctor()[1]])
+        (self.state / "quazor/last_run.jsonl").write_text("no record\n")
+        self.assert_refused(self.doctor(), "last run", "line 1: it is no JSON")
+
+
+class BrokenInstallationTest(DoctorCase):
+    """An installation of its own, whose data can be broken."""
+
+    def setUp(self):
+        super().setUp()
+        built = pathlib.Path(PROGRAM).parent.parent
+        root = self.directory / "root"
+        (root / "bin").mkdir(parents=True)
+        shutil.copy(PROGRAM, root / "bin")
+        os.symlink(built / "lib", root / "lib")
+        self.data = root / "share/quazor"
+        for name in DATA:
+            shutil.copytree(built / "share/quazor" / name, self.data / name)
+        self.addCleanup(setattr, command_line_fixture, "PROGRAM", PROGRAM)
+        command_line_fixture.PROGRAM = str(root / "bin" / pathlib.Path(PROGRAM).name)
+
+    def test_data_that_cannot_be_used(self):
+        kinds = {"scenarios/healthy.json": "backend simulated", "scenarios/camera_sync/frames_dropped.json": "phone",
+                 "bindings/vivid.json": "binding", "profiles/default.json": "profile",
+                 "explanations/LinuxErrorDomain.json": "explanations"}
+        for file, kind in kinds.items():
+            with self.subTest(file):
+                path = self.data / file
+                whole = path.read_text()
+                path.write_text('{"titel": 1}')
+                code, found = self.doctor()
+                path.write_text(whole)
+                self.assertEqual(code, 66)
+                refused = [name for fine, name, _ in found if not fine]
+                self.assertTrue(any(name.startswith(kind) for name in refused), refused)
+                self.assertEqual(self.doctor()[0], 0)
+
+
+if __name__ == "__main__":
+    unittest.main()
