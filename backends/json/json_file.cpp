@@ -1,6 +1,7 @@
 #include "backends/json/json_file.h"
 
 #include <algorithm>
+#include <array>
 #include <cstddef>
 #include <cstdint>
 #include <fstream>
@@ -206,7 +207,11 @@ std::string readTextFile(const std::filesystem::path& file) {
   if (std::filesystem::is_directory(status)) throw JsonProblem(name + ": this is a directory, not a file.");
   std::ifstream stream(file, std::ios::binary);
   if (!stream) throw JsonProblem(name + ": the file cannot be opened; check its permissions.");
-  std::string text{std::istreambuf_iterator<char>(stream), {}};
+  std::string text;
+  std::array<char, 65536> piece;  // read() notes a failure where iterators throw
+  while (stream.read(piece.data(), piece.size()) || stream.gcount() > 0) {
+    text.append(piece.data(), static_cast<std::size_t>(stream.gcount()));
+  }
   if (stream.bad()) throw JsonProblem(name + ": the file cannot be read.");
   return text;
 }

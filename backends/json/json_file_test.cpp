@@ -61,6 +61,20 @@ TEST(ParseJson, TellsTheLineOfWhatIsWrong) {
   EXPECT_EQ(problemOf("\n\xff"), "a.json:2: this is not UTF-8; save the file in that encoding.");
 }
 
+TEST(ReadTextFile, SaysWhyAFileCannotBeRead) {
+  const auto problemWith = [](const char* file) -> std::string {
+    try {
+      return "read: " + readTextFile(file);
+    } catch (const JsonProblem& problem) {
+      return problem.what();
+    }
+  };
+  EXPECT_EQ(problemWith("/dev/null"), "read: ");
+  EXPECT_EQ(problemWith("/proc/self/mem"), "/proc/self/mem: the file cannot be read.");
+  EXPECT_EQ(problemWith("/proc"), "/proc: this is a directory, not a file.");
+  EXPECT_EQ(problemWith("/proc/nothing"), "/proc/nothing: there is no such file.");
+}
+
 TEST(JsonProblem, KnowsThePlaceThatItIsAbout) {
   EXPECT_EQ(JsonProblem("sentence").place(), std::nullopt);
   EXPECT_EQ(JsonProblem("a[1]", "sentence").place(), "a[1]");
