@@ -1,5 +1,7 @@
 #include "host/child_process.h"
 
+#include "host/phone.h"
+
 #include <dirent.h>
 #include <fcntl.h>
 #include <linux/close_range.h>
@@ -32,6 +34,8 @@ using SteadyClock = std::chrono::steady_clock;
 // Out of the way of descriptors that a plug-in opens, and of small numbers that it may close by mistake.
 constexpr int kConnection = 250;
 constexpr SteadyClock::duration kLongestWait = 5s;
+// How long a process that puts a phone in order may take for it.
+constexpr SteadyClock::duration kLongestTidying = 1s;
 
 [[noreturn]] void refuse(const char* what) { throw std::system_error(errno, std::generic_category(), what); }
 
@@ -76,6 +80,12 @@ std::vector<pid_t> childrenOfThisProcess() {
     if (parent == self) children.push_back(static_cast<pid_t>(std::stol(name)));
   }
   return children;
+}
+
+bool isPuttingAPhoneInOrder(pid_t process) {
+  std::ifstream file("/proc/" + std::to_string(process) + "/comm");
+  std::string name;
+  return std::getline(file, name) && putsAPhoneInOrder(name);
 }
 
 // Where there may be fewer descriptors, it is the last.
@@ -174,18 +184,18 @@ ChildProcess::ChildProcess(const WatchedSignals& signals, const std::function<vo
 ChildProcess::~ChildProcess() {
   ::close(connection_);
   ::close(output_);
-  const SteadyClock::time_point limit = SteadyClock::now() + kLongestWait;
+  const SteadyClock::time_point begin = SteadyClock::now();
   signalGroup(SIGKILL);
   for (;;) {
     std::vector<pid_t> left;
     for (const pid_t one : childrenOfThisProcess()) {
       if (std::find(others_.begin(), others_.end(), one) != others_.end()) continue;
-      ::kill(one, SIGKILL);
+      if (SteadyClock::now() >= begin + kLongestTidying || !isPuttingAPhoneInOrder(one)) ::kill(one, SIGKILL);
       if (::waitpid(one, nullptr, WNOHANG) == 0) left.push_back(one);
     }
     // What has been ended may have left further ones to this process, so only a look that finds nobody is the last.
     if (left.empty() && childrenOfThisProcess().size() <= others_.size()) return;
-    if (SteadyClock::now() >= limit) return;
+    if (SteadyClock::now() >= begin + kLongestWait) return;
     std::this_thread::sleep_for(1ms);
   }
 }

@@ -1,5 +1,6 @@
 #include "host/child_process.h"
 
+#include "backends/linux/projector_guard.h"
 #include "host/test_signals.h"
 
 #include <fcntl.h>
@@ -13,6 +14,7 @@
 #include <chrono>
 #include <cstdio>
 #include <cstdlib>
+#include <filesystem>
 #include <stdexcept>
 #include <thread>
 
@@ -205,6 +207,35 @@ TEST_F(ChildProcessTest, GoesWithEverythingThatItStarted) {
   }
   EXPECT_EQ(::kill(grandchild, 0), -1);
   EXPECT_EQ(::kill(orphan, 0), -1);
+}
+
+// A process that ended left a guard, which takes so long to put the light out. Returns whether it did.
+bool goesDark(const WatchedSignals& signals, std::chrono::milliseconds duration) {
+  static std::chrono::milliseconds takes;
+  takes = duration;
+  std::string device = (std::filesystem::temp_directory_path() / "guarded-XXXXXX").string();
+  ::close(::mkstemp(device.data()));
+  {
+    const auto body = [&device](int) {
+      const auto darken = [](int descriptor, const ControlValue&) {
+        std::this_thread::sleep_for(takes);
+        if (::write(descriptor, "dark", 4) < 0) ::_exit(1);
+      };
+      int number = 0;
+      const auto guard = startProjectorGuard(device, {{1, 0}}, darken, &number);
+      ::raise(SIGKILL);
+    };
+    ChildProcess child(signals, body, std::nullopt);
+    while (!child.end()) std::this_thread::sleep_for(1ms);
+  }
+  const bool isDark = std::filesystem::file_size(device) == 4;
+  std::filesystem::remove(device);
+  return isDark;
+}
+
+TEST_F(ChildProcessTest, LeavesAProjectorsGuardTheTimeToPutTheLightOut) {
+  EXPECT_TRUE(goesDark(signals_, 100ms));
+  EXPECT_FALSE(goesDark(signals_, 30s)) << "but not for ever";
 }
 
 TEST_F(ChildProcessTest, LeavesOtherChildrenAlone) {

@@ -1,9 +1,12 @@
 #include "host/phone.h"
 
+#include "backends/linux/journal_log.h"
 #include "backends/linux/linux_phone.h"
 #include "backends/linux/probe.h"
+#include "backends/linux/projector_guard.h"
 #include "backends/simulated/scenario.h"
 #include "backends/simulated/simulated_phone.h"
+#include "backends/threads/system_log.h"
 #include "host/exit_code.h"
 
 #include <optional>
@@ -96,6 +99,12 @@ PhoneMaker phonesOfBinding(const std::filesystem::path& file) {
 PhoneProbe probeThisMachine() {
   MachineProbe probe = probeMachine(sourcesOfRunningSystem());
   return {std::move(probe.lines), std::move(probe.binding)};
+}
+
+bool putsAPhoneInOrder(std::string_view processName) { return processName == kProjectorGuardName; }
+
+std::shared_ptr<LogBackend> systemLogOfThisMachine() {
+  return std::make_shared<JournalLog>(std::make_shared<SystemLog>());
 }
 
 ScenarioSummary summaryOfScenario(const std::filesystem::path& file) {

@@ -1,6 +1,7 @@
 // Phones to run diagnostics on. phone.cpp is the only place that names the backend that stands behind them.
 #pragma once
 
+#include "frame/log_channel.h"
 #include "frame/ordered_map.h"
 #include "platform/platform.h"
 
@@ -86,6 +87,13 @@ struct PhoneProbe {
   std::string binding;
 };
 PhoneProbe probeThisMachine();
+
+// True of the name of a process that a phone leaves behind to put its hardware in order, as a light that must not stay
+// on; it ends by itself, soon.
+bool putsAPhoneInOrder(std::string_view processName);
+
+// Where this machine keeps log lines: its journal, or syslog(3) where there is none.
+std::shared_ptr<LogBackend> systemLogOfThisMachine();
 
 // What a scenario file says of itself. Throws a Refusal (kCannotRead) when the file cannot be read.
 ScenarioSummary summaryOfScenario(const std::filesystem::path& file);

@@ -1,8 +1,8 @@
 #include "host/run_events.h"
 
-#include "backends/threads/system_log.h"
 #include "host/host_error.h"
 #include "host/last_run.h"
+#include "host/phone.h"
 #include "host/timestamp.h"
 
 #include <chrono>
@@ -35,7 +35,7 @@ RunEvents::RunEvents(const Options& options, bool keepsLastRun, Console& console
   if (keepsLastRun) {
     if (std::unique_ptr<RecordWriter> last = lastRunRecord()) records_.push_back(std::move(last));
   }
-  if (options.systemLog) systemLog_ = std::make_shared<SystemLog>();
+  if (options.systemLog) systemLog_ = systemLogOfThisMachine();
 }
 
 void RunEvents::take(const RunEvent& event) {

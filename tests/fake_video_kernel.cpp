@@ -225,6 +225,7 @@ int FakeVideoKernel::lock(int descriptor) {
 }
 
 int FakeVideoKernel::ioctl(int descriptor, unsigned long request, void* argument) {
+  if (beforeCall) beforeCall(request);
   const std::lock_guard lock(mutex_);
   FakeNode& node = nodes_.at(descriptors_.at(descriptor));
   if (node.gone) return -ENODEV;

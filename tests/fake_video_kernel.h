@@ -13,6 +13,7 @@
 #include <cstdint>
 #include <deque>
 #include <filesystem>
+#include <functional>
 #include <map>
 #include <mutex>
 #include <optional>
@@ -98,6 +99,8 @@ class FakeVideoKernel : public VideoKernel {
 
   // The request fails `times` times on that node, after `after` times at which it did not.
   void failNext(const std::string& path, unsigned long request, int number, int times = 1, int after = 0);
+  // Called, on its thread, before each call to a driver; to be set while none is made.
+  std::function<void(unsigned long request)> beforeCall;
   int failNextMaps = 0;      // with ENOMEM
   int makeEventProblem = 0;  // an error number
   int guardProblem = 0;      // an error number

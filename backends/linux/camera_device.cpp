@@ -5,6 +5,7 @@
 
 #include <cmath>
 #include <string>
+#include <string_view>
 #include <utility>
 
 namespace quazor {
@@ -21,9 +22,12 @@ std::shared_ptr<OpenedVideoNode> openMatching(const std::shared_ptr<VideoKernel>
 }  // namespace
 
 Value CameraSettings::darkness() {
-  return Dictionary{{std::string(capture_key::Mode), 0},
-                    {std::string(capture_key::StructuredLightPattern), 0},
-                    {std::string(capture_key::StructuredLightCurrent), 0}};
+  Dictionary dark;
+  for (const std::string_view key :
+       {capture_key::Mode, capture_key::StructuredLightPattern, capture_key::StructuredLightCurrent}) {
+    dark.set(key, 0);
+  }
+  return dark;
 }
 
 std::shared_ptr<PixelBufferHandler> CameraSettings::frameHandler() const {
@@ -53,14 +57,22 @@ bool LinuxCamera::open(const std::shared_ptr<VideoKernel>& kernel, const std::ve
 }
 
 bool LinuxCamera::prepare(DiagnosticErrorPtr* error) {
-  return node_->takeAlone(error) && (!binding_.projector || node_->set(binding_.projector->off, error)) &&
-         node_->set(binding_.controls, error);
+  const bool prepared = node_->takeAlone(error) &&
+                        (!binding_.projector || node_->set(binding_.projector->off, error)) &&
+                        node_->set(binding_.controls, error);
+  if (prepared) settings_.autoExposure = exposesAutomatically();
+  return prepared;
+}
+
+bool LinuxCamera::exposesAutomatically() const {
+  const VideoControl* const control = node_->controlOfId(V4L2_CID_EXPOSURE_AUTO);
+  if (control == nullptr) return false;
+  return node_->read(*control, nullptr).value_or(V4L2_EXPOSURE_MANUAL) != V4L2_EXPOSURE_MANUAL;
 }
 
 void LinuxCamera::close() {
   node_.reset();
   metadataNode_.reset();
-  settings_.outputHandlers = Dictionary{};
 }
 
 bool LinuxCamera::setFormatIndex(const Value& index, DiagnosticErrorPtr* error) {
@@ -126,8 +138,7 @@ bool LinuxCamera::setLightSource(const Value& configuration, DiagnosticErrorPtr*
   for (const ControlSetting& setting : lightOf(configuration)) {
     const VideoControl* const control = node_->control(setting.control, error);
     if (control == nullptr) return false;
-    if (control->type != V4L2_CTRL_TYPE_BUTTON &&
-        (setting.value < control->lowest || setting.value > control->highest)) {
+    if (!takes(*control, setting.value)) {
       return refuseLinux(error, LinuxErrorCode::kBadValue, "%@: the control \"%@\" takes %@ to %@, not %@.", port(),
                          control->name, control->lowest, control->highest, setting.value);
     }

@@ -62,7 +62,7 @@ class LinuxCamera final {
   std::shared_ptr<CameraRun> run;
 
   // Finds and opens the camera's nodes among those that there are, puts its projector out and sets the binding's
-  // controls. On failure nothing is left open. The settings are new.
+  // controls. On failure nothing is left open. The settings are new; automatic exposure is as the driver has it.
   bool open(const std::shared_ptr<VideoKernel>& kernel, const std::vector<VideoNode>& nodes, DiagnosticErrorPtr* error);
   void close();
 
@@ -79,6 +79,7 @@ class LinuxCamera final {
 
  private:
   bool prepare(DiagnosticErrorPtr* error);
+  bool exposesAutomatically() const;
   bool applyFormat(const Value& index, DiagnosticErrorPtr* error);
   std::optional<FrameInterval> applyRates(const std::optional<Value>& minimum, const std::optional<Value>& maximum,
                                           DiagnosticErrorPtr* error);

@@ -10,6 +10,7 @@
 #include <gtest/gtest.h>
 
 #include <fcntl.h>
+#include <malloc.h>
 #include <sys/resource.h>
 #include <sys/socket.h>
 #include <sys/wait.h>
@@ -17,7 +18,9 @@
 
 #include <algorithm>
 #include <array>
+#include <atomic>
 #include <chrono>
+#include <cstddef>
 #include <ctime>
 #include <filesystem>
 #include <fstream>
@@ -231,6 +234,18 @@ TEST_F(DescriptorRunLoopTest, AWatchThatHasGoneTellsNothing) {
   EXPECT_EQ(handled_, 0);
 }
 
+TEST_F(DescriptorRunLoopTest, WatchesThatHaveGoneLeaveNothingBehind) {
+  const auto comeAndGo = [this] {
+    for (int i = 0; i < 1000; ++i) {
+      watchDescriptor(loop_, near_, source_)->arm();
+      run();
+    }
+    return ::mallinfo2().uordblks;
+  };
+  const std::size_t before = comeAndGo();
+  EXPECT_LT(comeAndGo(), before + 10'000);
+}
+
 TEST_F(DescriptorRunLoopTest, AWatchKeepsItsDescriptorAndNotItsSource) {
   const int descriptor = near_->get();
   near_.reset();
@@ -250,7 +265,15 @@ TEST_F(DescriptorRunLoopTest, AWatchMayGoOnAnotherThreadWhileTheLoopSleeps) {
   watch_->arm();
   const int descriptor = near_->get();
   near_.reset();
-  std::thread other([this] {
+  std::atomic<bool> runs = false;
+  loop_.addObserver(loop_.makeObserver(kRunLoopBeforeWaiting, false, 0,
+                                       [&runs](RunLoopActivities) {
+                                         runs = true;
+                                         runs.notify_one();
+                                       }),
+                    kMode);
+  std::thread other([this, &runs] {
+    runs.wait(false);
     std::this_thread::sleep_for(2ms);
     watch_.reset();
     loop_.stop();

@@ -141,10 +141,21 @@ class FakeHidrawCalls final : public HidrawCalls {
     device = std::move(far);
     return std::move(near);
   }
+  long read(int descriptor, std::span<std::uint8_t> room) override {
+    if (readErrors.empty()) return ::read(descriptor, room.data(), room.size());
+    errno = readErrors.front();
+    readErrors.erase(readErrors.begin());
+    return -1;
+  }
   int setFeature(int descriptor, std::span<const std::uint8_t> report) override {
     EXPECT_GE(descriptor, 0);
     features.emplace_back(report.begin(), report.end());
     time += featureTime;
+    if (featureInterruptions > 0) {
+      --featureInterruptions;
+      errno = EINTR;
+      return -1;
+    }
     errno = featureError;
     return featureError == 0 ? static_cast<int>(report.size()) : -1;
   }
@@ -152,6 +163,8 @@ class FakeHidrawCalls final : public HidrawCalls {
 
   int openError = 0;
   std::function<void()> onOpen;
+  std::vector<int> readErrors;  // of the next reads
+  int featureInterruptions = 0;
   int featureError = 0;
   std::chrono::nanoseconds featureTime{0};
   std::chrono::nanoseconds time{0};

@@ -2,8 +2,6 @@
 
 #include "backends/linux/linux_error.h"
 
-#include <unistd.h>
-
 #include <algorithm>
 #include <array>
 #include <cerrno>
@@ -15,13 +13,18 @@ void HidrawInput::open(std::shared_ptr<const FileDescriptor> descriptor) {
   const std::lock_guard lock(mutex_);
   descriptor_ = std::move(descriptor);
   ended_ = false;
-  for (const Scheduled& scheduled : places_) watch(scheduled);
+  for (const Scheduled& scheduled : places_) watchOrSignal(scheduled);
 }
 
 void HidrawInput::close() {
   const std::lock_guard lock(mutex_);
   descriptor_.reset();
-  for (const Scheduled& scheduled : places_) scheduled.place->watch.reset();
+  for (const Scheduled& scheduled : places_) {
+    if (scheduled.place->watch == nullptr) continue;
+    scheduled.place->watch.reset();
+    // On another thread than this the loop may sleep, and keeps the descriptor open until it wakes.
+    scheduled.source->signal();
+  }
 }
 
 std::shared_ptr<const FileDescriptor> HidrawInput::descriptor() const {
@@ -51,7 +54,7 @@ void HidrawInput::schedule(RunLoop& loop, std::string_view mode) {
     if (find(loop, mode) != places_.end()) return;
     if (descriptor_ != nullptr && places_.empty()) throwAwayWhatIsKept();
     places_.push_back({place, source});
-    if (descriptor_ != nullptr) watch(places_.back());
+    if (descriptor_ != nullptr) watchOrSignal(places_.back());
   }
   loop.addSource(source, mode);
 }
@@ -81,23 +84,32 @@ void HidrawInput::retire() {
   places_.clear();
 }
 
-// Has the loop wait for the descriptor, or the source tell that it cannot.
-void HidrawInput::watch(const Scheduled& scheduled) {
-  if (ended_) return;
-  Place& place = *scheduled.place;
-  place.watch = watchDescriptor(*place.loop, descriptor_, scheduled.source);
-  if (place.watch != nullptr) {
-    place.watch->arm();
-  } else {
-    scheduled.source->signal();
-  }
+// Has the loop wait for the descriptor. When this is not the loop's thread, its source does so there.
+void HidrawInput::watchOrSignal(const Scheduled& scheduled) {
+  if (!ended_ && !watch(*scheduled.place)) scheduled.source->signal();
+}
+
+// False when this is no loop that can wait for descriptors, or not its thread.
+bool HidrawInput::watch(Place& place) {
+  place.watch = watchDescriptor(*place.loop, descriptor_, place.source.lock());
+  if (place.watch != nullptr) place.watch->arm();
+  return place.watch != nullptr;
 }
 
 // The kernel gives one report for each read, and drops what does not fit.
-void HidrawInput::throwAwayWhatIsKept() {
-  std::uint8_t byte = 0;
-  for (std::size_t i = 0; i<kMostInARound&& ::read(descriptor_->get(), &byte, 1)> 0; ++i) {
+void HidrawInput::throwAwayWhatIsKept() const {
+  std::array<std::uint8_t, 1> byte{};
+  for (std::size_t i = 0; i < kMostInARound && read(byte) > 0; ++i) {
   }
+}
+
+// A read that never waits can be interrupted nevertheless: hidraw looks for signals before it looks for reports.
+long HidrawInput::read(std::span<std::uint8_t> room) const {
+  long size = -1;
+  do {
+    size = calls_->read(descriptor_->get(), room);
+  } while (size < 0 && errno == EINTR);
+  return size;
 }
 
 std::vector<HidrawInput::Scheduled>::const_iterator HidrawInput::find(const RunLoop& loop,
@@ -131,10 +143,10 @@ bool HidrawInput::deliver(Place& place) {
 }
 
 // Looks at everything anew: the receiver may have changed all of it.
-std::optional<HidrawInput::Input> HidrawInput::next(const Place& place, std::span<std::uint8_t, kLongest> buffer) {
+std::optional<HidrawInput::Input> HidrawInput::next(Place& place, std::span<std::uint8_t, kLongest> buffer) {
   const std::lock_guard lock(mutex_);
   if (!isScheduled(place) || descriptor_ == nullptr || ended_) return std::nullopt;
-  if (place.watch == nullptr) {
+  if (place.watch == nullptr && !watch(place)) {
     ended_ = true;
     DiagnosticErrorPtr error;
     failLinux(&error, LinuxErrorCode::kNotSupported,
@@ -143,7 +155,7 @@ std::optional<HidrawInput::Input> HidrawInput::next(const Place& place, std::spa
   }
   const std::size_t idBytes = numbered_ ? 0 : 1;
   buffer.front() = 0;
-  const ssize_t size = ::read(descriptor_->get(), buffer.data() + idBytes, buffer.size() - idBytes);
+  const long size = read(buffer.subspan(idBytes));
   if (size < 0 && errno == EAGAIN) return std::nullopt;
   if (size <= 0) return Input{{}, takeEnd(size, errno), receiver_};
   return Input{buffer.first(idBytes + static_cast<std::size_t>(size)), nullptr, receiver_};

@@ -3,6 +3,7 @@
 
 #include "backends/linux/descriptor_run_loop.h"
 #include "backends/linux/file_descriptor.h"
+#include "backends/linux/hidraw_calls.h"
 #include "platform/hid.h"
 #include "platform/run_loop.h"
 
@@ -30,15 +31,16 @@ class HidrawInput final : public std::enable_shared_from_this<HidrawInput> {
   // The kernel's largest report (HID_MAX_BUFFER_SIZE) with the byte of its ID.
   static constexpr std::size_t kLongest = 16385;
 
-  // `device` stands in messages. `numbered` says whether the device's reports begin with their ID; where they do not, a
-  // 0 is put before each.
-  HidrawInput(std::string device, bool numbered) : device_(std::move(device)), numbered_(numbered) {}
+  // `calls` must not be null. `device` stands in messages. `numbered` says whether the device's reports begin with
+  // their ID; where they do not, a 0 is put before each.
+  HidrawInput(std::shared_ptr<HidrawCalls> calls, std::string device, bool numbered)
+      : calls_(std::move(calls)), device_(std::move(device)), numbered_(numbered) {}
   HidrawInput(const HidrawInput&) = delete;
   HidrawInput& operator=(const HidrawInput&) = delete;
 
   // From now on reports are read from `descriptor`, whose reads must not wait.
   void open(std::shared_ptr<const FileDescriptor> descriptor);
-  // Lets go of the descriptor.
+  // Lets go of the descriptor; loops that wait for it let go of it at once.
   void close();
   // What is open, or null.
   std::shared_ptr<const FileDescriptor> descriptor() const;
@@ -59,7 +61,8 @@ class HidrawInput final : public std::enable_shared_from_this<HidrawInput> {
     RunLoop* loop = nullptr;
     std::string mode;
     std::weak_ptr<RunLoopSource> source;
-    std::shared_ptr<DescriptorWatch> watch;  // while the device is open; null on a loop that cannot wait for it
+    // While the device is open, since the loop's own thread first came here; null on a loop that cannot wait for it.
+    std::shared_ptr<DescriptorWatch> watch;
   };
   struct Scheduled {
     std::shared_ptr<Place> place;
@@ -73,13 +76,16 @@ class HidrawInput final : public std::enable_shared_from_this<HidrawInput> {
   };
 
   bool deliver(Place& place);
-  std::optional<Input> next(const Place& place, std::span<std::uint8_t, kLongest> buffer);
+  std::optional<Input> next(Place& place, std::span<std::uint8_t, kLongest> buffer);
   DiagnosticErrorPtr takeEnd(long size, int number);
-  void watch(const Scheduled& scheduled);
-  void throwAwayWhatIsKept();
+  void watchOrSignal(const Scheduled& scheduled);
+  bool watch(Place& place);
+  void throwAwayWhatIsKept() const;
+  long read(std::span<std::uint8_t> room) const;
   std::vector<Scheduled>::const_iterator find(const RunLoop& loop, std::string_view mode) const;
   bool isScheduled(const Place& place) const;
 
+  const std::shared_ptr<HidrawCalls> calls_;
   const std::string device_;
   const bool numbered_;
 

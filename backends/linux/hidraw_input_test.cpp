@@ -11,6 +11,7 @@
 #include <fcntl.h>
 
 #include <algorithm>
+#include <atomic>
 #include <chrono>
 #include <cstddef>
 #include <ctime>
@@ -45,7 +46,7 @@ class HidrawInputTest : public ::testing::Test {
   }
 
   void make(bool numbered) {
-    input_ = std::make_shared<HidrawInput>("/dev/hidraw0", numbered);
+    input_ = std::make_shared<HidrawInput>(calls_, "/dev/hidraw0", numbered);
     input_->setReceiver(receiver());
   }
   HidDevice::InputReportCallback receiver() {
@@ -79,6 +80,7 @@ class HidrawInputTest : public ::testing::Test {
   }
 
   RunLoop& loop_ = *makeLinuxRunLoops()->currentRunLoop();
+  const std::shared_ptr<FakeHidrawCalls> calls_ = std::make_shared<FakeHidrawCalls>();
   std::shared_ptr<HidrawInput> input_;
   FileDescriptor device_;
   std::vector<std::string> seen_;
@@ -261,6 +263,59 @@ TEST_F(HidrawInputTest, AReadThatFailsOtherwiseIsToldWithTheSystemsError) {
   EXPECT_THAT(seen_, ElementsAre("LinuxErrorDomain code 1: read on /dev/hidraw0 failed: Is a directory (EISDIR)"));
 }
 
+TEST_F(HidrawInputTest, EveryErrorOfAReadEndsTheReportsOnceButForThoseThatSayNothing) {
+  const struct {
+    int number;
+    std::vector<std::string> seen;  // of a run with two reports, the first read of which gives the error
+  } kRows[] = {
+      {EINTR, {"7601, 2", "7602, 2"}},
+      {EAGAIN, {"7601, 2", "7602, 2"}},
+      {EIO, {kGone}},
+      {ENODEV, {kGone}},
+      {EFAULT, {"LinuxErrorDomain code 1: read on /dev/hidraw0 failed: Bad address (EFAULT)"}},
+  };
+  for (const auto& row : kRows) {
+    make(true);
+    seen_.clear();
+    openAndSchedule();
+    send(1);
+    send(2);
+    calls_->readErrors = {row.number};
+    run();
+    run();
+    EXPECT_EQ(seen_, row.seen) << row.number;
+    unschedule();
+  }
+}
+
+TEST_F(HidrawInputTest, ASignalDoesNotKeepOldReports) {
+  open();
+  send(1);
+  send(2);
+  calls_->readErrors = {EINTR, EINTR};
+  schedule();
+  send(3);
+  run();
+  EXPECT_THAT(seen_, ElementsAre("7603, 2"));
+}
+
+TEST_F(HidrawInputTest, ADeviceMayBeOpenedOnAnotherThreadThanThatOfItsLoop) {
+  schedule();
+  schedule(kOther);
+  std::thread([this] { open(); }).join();
+  send(1);
+  run(0ns, kOther);
+  EXPECT_THAT(seen_, ElementsAre("7601, 2"));
+  std::thread device([this] {
+    std::this_thread::sleep_for(2ms);
+    send(2);
+  });
+  onInput_ = [this] { loop_.stop(); };
+  EXPECT_EQ(run(10s), RunLoopResult::kStopped);
+  device.join();
+  EXPECT_THAT(seen_, ElementsAre("7601, 2", "7602, 2"));
+}
+
 TEST_F(HidrawInputTest, AClosedDeviceGivesNothingAndItsDescriptorIsClosedAtOnce) {
   openAndSchedule();
   const int descriptor = input_->descriptor()->get();
@@ -275,6 +330,29 @@ TEST_F(HidrawInputTest, AClosedDeviceGivesNothingAndItsDescriptorIsClosedAtOnce)
   send(2);
   run();
   EXPECT_THAT(seen_, ElementsAre("7602, 2"));
+}
+
+TEST_F(HidrawInputTest, ADeviceThatIsClosedOnAnotherThreadDoesNotWaitForItsLoopToWake) {
+  openAndSchedule();
+  const int descriptor = input_->descriptor()->get();
+  std::atomic<bool> runs = false;
+  loop_.addObserver(loop_.makeObserver(kRunLoopBeforeWaiting, false, 0,
+                                       [&runs](RunLoopActivities) {
+                                         runs = true;
+                                         runs.notify_one();
+                                       }),
+                    kRunLoopDefaultMode);
+  std::thread other([this, descriptor, &runs] {
+    runs.wait(false);
+    std::this_thread::sleep_for(2ms);
+    input_->close();
+    const auto end = std::chrono::steady_clock::now() + 10s;
+    while (::fcntl(descriptor, F_GETFD) != -1 && std::chrono::steady_clock::now() < end) std::this_thread::yield();
+    EXPECT_EQ(::fcntl(descriptor, F_GETFD), -1);
+    loop_.stop();
+  });
+  EXPECT_EQ(run(60s), RunLoopResult::kStopped);
+  other.join();
 }
 
 TEST_F(HidrawInputTest, WithoutAReceiverReportsAreLost) {

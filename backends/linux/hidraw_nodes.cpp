@@ -4,11 +4,11 @@
 #include <unistd.h>
 
 #include <algorithm>
+#include <array>
 #include <cerrno>
 #include <charconv>
 #include <cstring>
 #include <fstream>
-#include <iterator>
 #include <optional>
 #include <string_view>
 #include <system_error>
@@ -35,7 +35,12 @@ std::optional<unsigned> numberOf(const std::string& name) {
 std::optional<Bytes> contentOf(const fs::path& file) {
   std::ifstream stream(file, std::ios::binary);
   if (!stream) return std::nullopt;
-  return Bytes(std::istreambuf_iterator<char>(stream), std::istreambuf_iterator<char>());
+  Bytes content;
+  for (std::array<char, 4096> part; stream.read(part.data(), part.size()), stream.gcount() > 0;) {
+    content.insert(content.end(), part.begin(), part.begin() + stream.gcount());
+  }
+  // A device that is removed meanwhile makes a read fail.
+  return stream.bad() ? std::nullopt : std::optional(std::move(content));
 }
 
 // The line "HID_NAME=..." of the device's uevent file.

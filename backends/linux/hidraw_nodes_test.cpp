@@ -84,6 +84,24 @@ TEST_F(HidrawNodesTest, WhatGoesAwayMeanwhileIsLeftOut) {
   EXPECT_THAT(paths(), IsEmpty());
 }
 
+TEST_F(HidrawNodesTest, ADescriptorThatCannotBeReadIsThatOfADeviceThatGoesAway) {
+  tree_.connect("hidraw0", sensorDescriptor());
+  tree_.connect("hidraw1", sensorDescriptor());
+  const std::filesystem::path file = tree_.classEntry("hidraw0") / "device" / "report_descriptor";
+  std::filesystem::remove(file);
+  std::filesystem::create_directory(file);  // can be opened, and every read fails
+  EXPECT_THAT(paths(), ElementsAre("hidraw1"));
+}
+
+TEST_F(HidrawNodesTest, ALongDescriptorIsReadWhole) {
+  Bytes longest = sensorDescriptor();
+  while (longest.size() < 10'000) longest.insert(longest.end(), {0x15, 0x00});
+  tree_.connect("hidraw0", longest);
+  const std::vector<HidrawNode> nodes = hidrawNodes(tree_.roots());
+  ASSERT_THAT(nodes, SizeIs(1));
+  EXPECT_EQ(nodes.front().rawDescriptor, longest);
+}
+
 TEST_F(HidrawNodesTest, AKernelWithoutHidrawHasNoNodes) {
   EXPECT_TRUE(hasHidraw(tree_.roots()));
   EXPECT_THAT(paths(), IsEmpty());

@@ -89,10 +89,7 @@ bool LinuxDevice::takeAll(const CaptureStreams& streams, DiagnosticErrorPtr* err
       taken.push_back(camera);
       continue;
     }
-    for (LinuxCamera* one : taken) {
-      one->close();
-      one->holder = 0;
-    }
+    for (LinuxCamera* one : taken) cameras.letGo(*one);
     return false;
   }
   return true;
@@ -108,10 +105,7 @@ bool LinuxDevice::giveBackAll(const CaptureStreams& streams, DiagnosticErrorPtr*
     }
     given.push_back(camera);
   }
-  for (LinuxCamera* camera : given) {
-    camera->close();
-    camera->holder = 0;
-  }
+  for (LinuxCamera* camera : given) user_->cameras().letGo(*camera);
   return true;
 }
 

@@ -186,6 +186,33 @@ TEST(LinuxCaptureTest, TheLastReferenceStopsAndFreesAll) {
   EXPECT_EQ(fake.control(kStrobe), 0);
 }
 
+TEST(LinuxCaptureTest, AHandlerThatOwnsADeviceMayGoInEveryWay) {
+  const struct {
+    const char* name;
+    void (*drop)(Fake&);
+  } rows[] = {
+      {"replaced",
+       [](Fake& fake) { fake.set(fake.wide(), capture_key::VideoOutputHandlers, Fake::output(Dictionary{})); }},
+      {"given back", [](Fake& fake) { fake.device->relinquishControlOfStreams({fake.streams[0]}, nullptr); }},
+      {"invalidated", [](Fake& fake) { fake.device->invalidate(nullptr); }},
+      {"invalidated while it streams",
+       [](Fake& fake) {
+         EXPECT_EQ(fake.start(0), "done");
+         fake.device->invalidate(nullptr);
+       }},
+      {"with the last reference", [](Fake& fake) { fake.letGo(); }},
+  };
+  for (const auto& row : rows) {
+    Fake fake;
+    fake.prepare(0);
+    std::shared_ptr<CaptureDevice> owned = fake.capture->createPlugIn()->device(nullptr);
+    const std::weak_ptr<CaptureDevice> watched = owned;
+    fake.handle(0, [owned = std::move(owned)](PixelBuffer&, MediaTime) {});
+    row.drop(fake);
+    EXPECT_TRUE(watched.expired()) << row.name;
+  }
+}
+
 TEST(LinuxCaptureTest, ADeviceHasTwoProperties) {
   Fake fake;
   EXPECT_EQ(outcome([&](auto* error) { return fake.device->valueForProperty("Depth", error); }),

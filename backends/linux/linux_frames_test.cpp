@@ -3,7 +3,6 @@
 #include "backends/linux/linux_capture_for_tests.h"
 #include "backends/linux/video_node.h"
 
-#include <atomic>
 #include <cerrno>
 #include <thread>
 
@@ -140,6 +139,19 @@ TEST(LinuxFramesTest, FewerBuffersThanAskedForAreEnough) {
   fake.kernel->passTime(990ms);
   EXPECT_EQ(fake.counter(0, "SequenceGapCount"), 0);
   EXPECT_EQ(fake.stop(0), "done");
+}
+
+TEST(LinuxFramesTest, OneMetadataBufferIsEnough) {
+  Fake fake;
+  SeenFrames seen;
+  fake.kernel->with((fake.kernel->roots().dev / "video13").string(),
+                    [](FakeNode& node) { return node.mostBuffers = 1; });
+  fake.prepare(kInfrared);
+  fake.handle(kInfrared, seen.handler());
+  ASSERT_EQ(fake.start(kInfrared), "done");
+  fake.kernel->passTime(330ms);
+  EXPECT_EQ(seen.wait(10).size(), 10U);
+  EXPECT_EQ(fake.counter(kInfrared, "MetadataErrorCount"), 0);
 }
 
 TEST(LinuxFramesTest, GapsAndDamagedBuffersAreCountedAndDamagedOnesAreNoFrames) {
@@ -377,112 +389,6 @@ TEST(LinuxFramesTest, ACounterThatVanishesMakesTheCountersUnreadableDuringAndAft
   EXPECT_EQ(read(), want);
   EXPECT_EQ(fake.stop(kInfrared), "done");
   EXPECT_EQ(read(), want);
-}
-
-TEST(LinuxFramesTest, AHandlerMayReadStopAndLetGoOfEverything) {
-  Fake fake;
-  std::mutex mutex;
-  std::condition_variable changed;
-  bool done = false;
-  std::string stopped;
-  std::string again;
-  fake.prepare(0);
-  fake.handle(0, [&](PixelBuffer&, MediaTime) {
-    stopped = fake.stop(0);
-    again = fake.stop(0);
-    EXPECT_EQ(fake.counter(0, "StreamErrorCount"), 0);
-    fake.letGo();
-    const std::lock_guard lock(mutex);
-    done = true;
-    changed.notify_all();
-  });
-  ASSERT_EQ(fake.start(0), "done");
-  fake.kernel->produce(fake.nodes[0]);
-  std::unique_lock lock(mutex);
-  ASSERT_TRUE(changed.wait_for(lock, 5s, [&] { return done; }));
-  EXPECT_EQ(stopped, "done");
-  EXPECT_EQ(again, "7 BackFacingCamera is not running.");
-  for (int i = 0; i < 500 && !fake.kernel->isIdle(); ++i) std::this_thread::sleep_for(1ms);
-  EXPECT_TRUE(fake.kernel->isIdle());
-}
-
-TEST(LinuxFramesTest, AHandlerMayLetGoOfAStreamThatRuns) {
-  Fake fake;
-  fake.prepare(0);
-  fake.handle(0, [&](PixelBuffer&, MediaTime) { fake.letGo(); });
-  ASSERT_EQ(fake.start(0), "done");
-  fake.kernel->produce(fake.nodes[0]);
-  for (int i = 0; i < 5000 && !fake.kernel->isIdle(); ++i) std::this_thread::sleep_for(1ms);
-  EXPECT_TRUE(fake.kernel->isIdle());
-}
-
-// Holds a handler until it is let go on.
-class Gate {
- public:
-  void enter() {
-    std::unique_lock lock(mutex_);
-    entered_ = true;
-    changed_.notify_all();
-    changed_.wait(lock, [this] { return open_; });
-  }
-  void awaitEntry() {
-    std::unique_lock lock(mutex_);
-    changed_.wait(lock, [this] { return entered_; });
-  }
-  void open() {
-    const std::lock_guard lock(mutex_);
-    open_ = true;
-    changed_.notify_all();
-  }
-
- private:
-  std::mutex mutex_;
-  std::condition_variable changed_;
-  bool entered_ = false;
-  bool open_ = false;
-};
-
-TEST(LinuxFramesTest, AStopWaitsForTheHandlerThatRuns) {
-  Fake fake;
-  Gate gate;
-  std::atomic<bool> left = false;
-  fake.prepare(0);
-  fake.handle(0, [&](PixelBuffer&, MediaTime) {
-    gate.enter();
-    std::this_thread::sleep_for(3ms);
-    left = true;
-  });
-  ASSERT_EQ(fake.start(0), "done");
-  fake.kernel->produce(fake.nodes[0]);
-  gate.awaitEntry();
-  std::thread opener([&] {
-    std::this_thread::sleep_for(3ms);
-    gate.open();
-  });
-  EXPECT_EQ(fake.stop(0), "done");
-  EXPECT_TRUE(left);
-  opener.join();
-}
-
-TEST(LinuxFramesTest, WhileOneThreadStopsAHandlerMayInvalidate) {
-  Fake fake;
-  Gate gate;
-  std::string stopped;
-  fake.prepare(0);
-  fake.handle(0, [&](PixelBuffer&, MediaTime) {
-    gate.enter();
-    fake.device->invalidate(nullptr);
-  });
-  ASSERT_EQ(fake.start(0), "done");
-  fake.kernel->produce(fake.nodes[0]);
-  gate.awaitEntry();
-  std::thread stopper([&] { stopped = fake.stop(0); });
-  std::this_thread::sleep_for(5ms);  // by then it waits for the handler
-  gate.open();
-  stopper.join();
-  EXPECT_EQ(stopped, "done");
-  fake.letGo();
-  EXPECT_TRUE(fake.kernel->isIdle());
 }
 
 }  // namespace

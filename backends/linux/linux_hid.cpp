@@ -6,6 +6,7 @@
 #include <fcntl.h>
 #include <linux/hidraw.h>
 #include <sys/ioctl.h>
+#include <unistd.h>
 
 #include <algorithm>
 #include <cerrno>
@@ -20,6 +21,9 @@ class KernelCalls final : public HidrawCalls {
  public:
   FileDescriptor open(const std::filesystem::path& path) override {
     return FileDescriptor(::open(path.c_str(), O_RDWR | O_NONBLOCK | O_CLOEXEC));
+  }
+  long read(int descriptor, std::span<std::uint8_t> room) override {
+    return ::read(descriptor, room.data(), room.size());
   }
   int setFeature(int descriptor, std::span<const std::uint8_t> report) override {
     // The request's number holds the length; the kernel takes the bytes as its own to change.
@@ -53,7 +57,7 @@ class LinuxHidDevice final : public HidDevice {
       : node_(std::move(node)),
         roots_(std::move(roots)),
         calls_(std::move(calls)),
-        input_(std::make_shared<HidrawInput>(name(), node_.descriptor.numbered)) {}
+        input_(std::make_shared<HidrawInput>(calls_, name(), node_.descriptor.numbered)) {}
   ~LinuxHidDevice() override { input_->retire(); }
 
   std::string description() const override { return "HID device " + name() + " \"" + node_.name + "\""; }
@@ -68,7 +72,9 @@ class LinuxHidDevice final : public HidDevice {
       return false;
     }
     // The path may have come to stand for another device.
-    if (hidrawDevice(roots_, node_.path) != node_.device) {
+    const std::filesystem::path opened = hidrawDevice(roots_, node_.path);
+    if (opened.empty()) return refuse(error, LinuxErrorCode::kDeviceGone, "has been removed");
+    if (opened != node_.device) {
       return refuse(error, LinuxErrorCode::kDeviceGone, "has been removed, and another device has its place");
     }
     input_->open(std::make_shared<const FileDescriptor>(std::move(descriptor)));
@@ -87,7 +93,11 @@ class LinuxHidDevice final : public HidDevice {
                         std::to_string(kLongestFeature) + " bytes");
     }
     const std::chrono::nanoseconds begin = calls_->now();
-    if (calls_->setFeature(descriptor->get(), payload) >= 0) return true;
+    int sent = -1;
+    do {
+      sent = calls_->setFeature(descriptor->get(), payload);
+    } while (sent < 0 && errno == EINTR);  // a signal is no answer
+    if (sent >= 0) return true;
     tellFailedFeature(reportID, errno, calls_->now() - begin, error);
     return false;
   }

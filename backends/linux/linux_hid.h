@@ -20,7 +20,7 @@ inline constexpr std::chrono::milliseconds kHidAnswerTime{4500};
 // There is no manager when the kernel has no hidraw. Devices that this user may not use are found too; they say so when
 // they are opened. Input reports and payloads of feature reports begin with the byte of their ID, which is 0 where a
 // device has no IDs. Reports are handed on as long or as short as they come. A device is scheduled on run loops of
-// makeLinuxRunLoops(), of the calling thread; on any other its receiver gets an error, once.
+// makeLinuxRunLoops(); on any other its receiver gets an error, once.
 std::shared_ptr<HidService> makeLinuxHid();
 // The same with another kernel. `calls` must not be null.
 std::shared_ptr<HidService> makeLinuxHid(HidrawRoots roots, std::shared_ptr<HidrawCalls> calls);

@@ -178,6 +178,25 @@ TEST_F(LinuxHidTest, ADeviceInThePlaceOfAnotherIsNotOpened) {
   EXPECT_TRUE(find().at(0)->open(nullptr));
 }
 
+TEST_F(LinuxHidTest, ADeviceThatGoesWhileItIsOpenedHasNotBeenReplaced) {
+  const std::shared_ptr<HidDevice> device = sensor();
+  calls_->onOpen = [this] { tree_.disconnect("hidraw0"); };
+  EXPECT_EQ(errorOfOpen(*device), "LinuxErrorDomain code 9: /dev/hidraw0 has been removed.");
+  calls_->device.reset();
+}
+
+TEST_F(LinuxHidTest, ASignalIsNotTakenForTheAnswerToAFeatureReport) {
+  const std::shared_ptr<HidDevice> device = sensor();
+  ASSERT_TRUE(device->open(nullptr));
+  calls_->featureInterruptions = 2;
+  EXPECT_TRUE(device->setFeatureReportWithID(0xAB, Bytes{0xAB, 1}, nullptr));
+  EXPECT_THAT(calls_->features, SizeIs(3));
+  calls_->featureInterruptions = 1;
+  calls_->featureError = EIO;
+  calls_->featureTime = 2600ms;
+  EXPECT_THAT(errorOfFeature(*device, 0xAB, {0xAB, 1}), ::testing::HasSubstr("failed: the device did not answer"));
+}
+
 TEST_F(LinuxHidTest, FeatureReportsReachTheDeviceWhole) {
   const std::shared_ptr<HidDevice> device = sensor();
   EXPECT_EQ(errorOfFeature(*device, 0xAB, {0xAB, 1}), "LinuxErrorDomain code 7: /dev/hidraw0 is not open.");
@@ -277,6 +296,11 @@ TEST(HidrawCallsTest, TheyAskTheSystem) {
   const std::array<std::uint8_t, 2> report{0xAB, 1};
   EXPECT_LT(calls->setFeature(null.get(), report), 0);
   EXPECT_EQ(errno, ENOTTY);
+  std::array<std::uint8_t, 2> room{};
+  EXPECT_EQ(calls->read(null.get(), room), 0);
+  EXPECT_LT(calls->read(-1, room), 0);
+  EXPECT_EQ(errno, EBADF);
+  EXPECT_EQ(calls->read(calls->open("/dev/zero").get(), room), 2);
   const auto before = calls->now();
   EXPECT_GE(calls->now(), before);
 }

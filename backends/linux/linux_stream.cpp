@@ -81,8 +81,8 @@ bool LinuxStream::set(const Value& value, std::string_view key, DiagnosticErrorP
 // What only has to be kept: there is one output, which is the camera's.
 bool LinuxStream::setOutput(const Value& value, std::string_view key, DiagnosticErrorPtr* error) {
   CameraSettings& settings = camera().settings();
-  const auto keep = [&value](bool fits, Value& setting) {
-    if (fits) setting = value;
+  const auto keep = [&](bool fits, Value& setting) {
+    if (fits) user_->cameras().dropped.push_back(std::exchange(setting, value));
     return fits;
   };
   if (key == capture_key::MultipleOutputSupportEnabled) {

@@ -266,9 +266,34 @@ TEST(LinuxStreamTest, AutomaticExposureIsTheControlOfThatName) {
   EXPECT_EQ(get(fake, capture_key::AEEnabled), Value(true));
 }
 
+TEST(LinuxStreamTest, AutomaticExposureIsAsTheDriverHasItWhenControlIsTaken) {
+  const struct {
+    const char* name;
+    std::int64_t value;
+    int problem;
+    bool want;
+  } rows[] = {
+      {"automatic", V4L2_EXPOSURE_AUTO, 0, true},
+      {"in part automatic", V4L2_EXPOSURE_APERTURE_PRIORITY, 0, true},
+      {"as an earlier user left it", V4L2_EXPOSURE_MANUAL, 0, false},
+      {"not to be read", V4L2_EXPOSURE_AUTO, EIO, false},
+  };
+  for (const auto& row : rows) {
+    Fake fake;
+    fake.kernel->with(fake.nodes[0], [&row](FakeNode& node) {
+      node.controls = {{V4L2_CID_EXPOSURE_AUTO, "Auto Exposure", 0, 3, row.value, V4L2_CTRL_TYPE_MENU}};
+      return 0;
+    });
+    if (row.problem != 0) fake.kernel->failNext(fake.nodes[0], VIDIOC_G_EXT_CTRLS, row.problem);
+    ASSERT_EQ(fake.take(0), "done");
+    EXPECT_EQ(get(fake, capture_key::AEEnabled), Value(row.want)) << row.name;
+  }
+}
+
 TEST(LinuxStreamTest, ACameraWithoutAutomaticExposureCanOnlyBeWithout) {
   Fake fake;
   ASSERT_EQ(fake.take(0), "done");
+  EXPECT_EQ(get(fake, capture_key::AEEnabled), Value(false));
   EXPECT_EQ(fake.set(fake.wide(), capture_key::AEEnabled, false), "done");
   EXPECT_EQ(fake.set(fake.wide(), capture_key::AEEnabled, true),
             "5 BackFacingCamera: " + fake.nodes[0] + " has no automatic exposure.");
@@ -279,6 +304,19 @@ TEST(LinuxStreamTest, ACameraWithoutAProjectorHasNoLightSource) {
   ASSERT_EQ(fake.take(0), "done");
   EXPECT_EQ(fake.set(fake.wide(), capture_key::InfraredLightSourceConfiguration, Fake::light(2)),
             "5 BackFacingCamera has no projector, so no InfraredLightSourceConfiguration.");
+}
+
+TEST(LinuxStreamTest, AProjectorsSetOfBitsTakesEveryNumber) {
+  Fake fake;
+  fake.kernel->with(fake.nodes[3], [](FakeNode& node) {
+    FakeControl& power = *std::ranges::find(node.controls, kPower, &FakeControl::id);
+    power.type = V4L2_CTRL_TYPE_BITMASK;
+    return power.highest = 0;
+  });
+  ASSERT_EQ(fake.take(3), "done");
+  EXPECT_EQ(fake.set(fake.infrared(), capture_key::InfraredLightSourceConfiguration, Fake::light(2, 0, 5)), "done");
+  EXPECT_EQ(fake.start(3), "done");
+  EXPECT_EQ(fake.control(kPower), 5);
 }
 
 TEST(LinuxStreamTest, AProjectorsControlMustBeThere) {

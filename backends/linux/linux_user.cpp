@@ -13,12 +13,6 @@ LinuxUserId newUser(LinuxCameras& cameras) {
   return ++cameras.lastUser;
 }
 
-void letGo(LinuxCamera& camera) {
-  camera.close();
-  camera.holder = 0;
-  camera.freedByStop = false;
-}
-
 }  // namespace
 
 LinuxCameras::LinuxCameras(const Binding& binding, std::shared_ptr<VideoKernel> system, DeviceRoots deviceRoots)
@@ -55,6 +49,18 @@ std::optional<Dictionary> LinuxCameras::sessionStatus() const {
     }
   }
   return status;
+}
+
+void LinuxCameras::letGo(LinuxCamera& camera) {
+  dropped.push_back(std::exchange(camera.settings().outputHandlers, Dictionary{}));
+  camera.close();
+  camera.holder = 0;
+  camera.freedByStop = false;
+}
+
+HeldCameras::~HeldCameras() {
+  const std::vector<Value> dropped = std::exchange(cameras_.dropped, {});
+  lock_.unlock();
 }
 
 LinuxUser::LinuxUser(std::shared_ptr<LinuxCameras> cameras)
@@ -109,9 +115,9 @@ bool LinuxUser::stop(std::size_t index, DiagnosticErrorPtr* error) {
   if (!stopping) return false;
   poller_.remove(*camera.run);
   const bool stopped = camera.run->end(error);
-  const std::lock_guard lock(cameras_->mutex);
+  const HeldCameras held(*cameras_);
   camera.phase = CameraPhase::kStopped;
-  if (camera.freedByStop) letGo(camera);
+  if (camera.freedByStop) cameras_->letGo(camera);
   return stopped;
 }
 
@@ -122,34 +128,34 @@ bool LinuxUser::invalidate(DiagnosticErrorPtr* error) {
 
 bool LinuxUser::release(DiagnosticErrorPtr* error) {
   std::vector<LinuxCamera*> running;
-  std::vector<LinuxCamera*> stopping;
+  std::vector<std::shared_ptr<CameraRun>> stopping;  // who stops it frees the camera, whose next run is another
   {
-    const std::lock_guard lock(cameras_->mutex);
+    const HeldCameras held(*cameras_);
     for (const auto& camera : cameras_->cameras) {
       if (camera->holder != id_) continue;
       switch (camera->phase) {
-        case CameraPhase::kStopped: letGo(*camera); break;
+        case CameraPhase::kStopped: cameras_->letGo(*camera); break;
         case CameraPhase::kRunning:
           camera->phase = CameraPhase::kStopping;
           running.push_back(camera.get());
           break;
         case CameraPhase::kStopping:
           camera->freedByStop = true;
-          stopping.push_back(camera.get());
+          stopping.push_back(camera->run);
           break;
       }
     }
   }
   // One that a handler stops is done when the handler is; one that is stopped on another thread waits for this one,
   // which then is the handler's.
-  for (LinuxCamera* camera : stopping) poller_.remove(*camera->run);
+  for (const std::shared_ptr<CameraRun>& run : stopping) poller_.remove(*run);
   bool succeeded = true;
   for (LinuxCamera* camera : running) {
     poller_.remove(*camera->run);
     if (!camera->run->end(succeeded ? error : nullptr)) succeeded = false;
-    const std::lock_guard lock(cameras_->mutex);
+    const HeldCameras held(*cameras_);
     camera->phase = CameraPhase::kStopped;
-    letGo(*camera);
+    cameras_->letGo(*camera);
   }
   return succeeded;
 }

@@ -33,11 +33,30 @@ struct LinuxCameras {
   const DeviceRoots roots;
   const std::shared_ptr<DeliveredFrames> delivered = std::make_shared<DeliveredFrames>(0);
 
+  // Closes the camera and makes it nobody's.
+  void letGo(LinuxCamera& camera);
+
   std::mutex mutex;
   std::vector<std::unique_ptr<LinuxCamera>> cameras;
   std::vector<LinuxGroupState> groups;
   std::vector<std::size_t> configuredGroups;  // what MultiCamConfiguration was set to
   LinuxUserId lastUser = 0;
+  // Values of properties that nobody uses any more. With a handler goes what its maker put into it, perhaps a capture
+  // device: HeldCameras destroys them without the mutex.
+  std::vector<Value> dropped;
+};
+
+// Holds the mutex while it lives.
+class HeldCameras final {
+ public:
+  explicit HeldCameras(LinuxCameras& cameras) : cameras_(cameras), lock_(cameras.mutex) {}
+  HeldCameras(const HeldCameras&) = delete;
+  HeldCameras& operator=(const HeldCameras&) = delete;
+  ~HeldCameras();
+
+ private:
+  LinuxCameras& cameras_;
+  std::unique_lock<std::mutex> lock_;
 };
 
 // One user of the cameras. A device, its groups and its streams share it; when the last of them is gone, the user's
@@ -55,7 +74,7 @@ class LinuxUser final {
   // Runs the body with the cameras' mutex held; after invalidate() it is not run and the call is refused.
   template <class Body>
   std::invoke_result_t<Body&> perform(DiagnosticErrorPtr* error, Body&& body) const {
-    const std::lock_guard lock(cameras_->mutex);
+    const HeldCameras held(*cameras_);
     if (invalidated_) {
       refuseLinux(error, LinuxErrorCode::kWrongState, "The capture device has been invalidated; ask for a new one.");
       return {};

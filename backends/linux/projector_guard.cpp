@@ -3,8 +3,8 @@
 #include "backends/linux/file_descriptor.h"
 
 #include <fcntl.h>
-#include <linux/close_range.h>
 #include <linux/videodev2.h>
+#include <poll.h>
 #include <sys/ioctl.h>
 #include <sys/prctl.h>
 #include <sys/resource.h>
@@ -24,46 +24,30 @@
 namespace quazor {
 namespace {
 
-struct Connection {
-  FileDescriptor ours;
-  FileDescriptor theirs;
-};
-
-// Returns 0 or the error number.
-int connect(Connection& connection) {
-  std::array<int, 2> ends{};
-  if (::socketpair(AF_UNIX, SOCK_STREAM | SOCK_CLOEXEC, 0, ends.data()) != 0) return errno;
-  connection = {FileDescriptor(ends[0]), FileDescriptor(ends[1])};
-  return 0;
+// Closes every descriptor but those.
+void closeAllBut(const GuardDescriptors& kept) {
+  std::array<int, 3> numbers{kept.connection, kept.guarded, kept.device};
+  std::ranges::sort(numbers);
+  unsigned int first = 0;
+  for (const int number : numbers) {
+    const auto one = static_cast<unsigned int>(number);
+    if (first < one) ::syscall(SYS_close_range, first, one - 1, 0U);
+    first = one + 1;
+  }
+  ::syscall(SYS_close_range, first, ~0U, 0U);
 }
 
-// Waits for a byte or for the end of the connection.
-void await(int connection) {
-  char any = 0;
-  while (::read(connection, &any, 1) < 0 && errno == EINTR) continue;
-}
-
-void closeRange(unsigned int first, unsigned int last) {
-  if (first <= last) ::syscall(SYS_close_range, first, last, 0U);
-}
-
-// Closes every descriptor but the two.
-void closeAllBut(int one, int other) {
-  const auto low = static_cast<unsigned int>(std::min(one, other));
-  const auto high = static_cast<unsigned int>(std::max(one, other));
-  if (low > 0) closeRange(0, low - 1);
-  closeRange(low + 1, high - 1);
-  closeRange(high + 1, ~0U);
-}
-
-// In the new process. Closing the last of its copies tells our process that it is ready. The priority helps it to come
-// before whoever looks for processes that were left behind; without the right to it, it is as good as any other.
-[[noreturn]] void becomeGuard(int connection, int device, const std::vector<ControlValue>& values, ControlSetter set) {
+// In the new process; it is ready when it says so. The priority helps it to come before whoever looks for processes
+// that were left behind; without the right to it, it is as good as any other.
+[[noreturn]] void becomeGuard(const GuardDescriptors& descriptors, const std::vector<ControlValue>& values,
+                              ControlSetter set) {
   ::setsid();
   ::prctl(PR_SET_NAME, kProjectorGuardName);
   ::setpriority(PRIO_PROCESS, 0, -20);
-  closeAllBut(connection, device);
-  guardControlsUntilEnd(connection, device, values.data(), values.size(), set);
+  closeAllBut(descriptors);
+  const char ready = 0;
+  ::send(descriptors.connection, &ready, 1, MSG_NOSIGNAL);
+  guardControlsUntilEnd(descriptors, values.data(), values.size(), set);
   ::_exit(0);
 }
 
@@ -99,25 +83,25 @@ void setVideoControl(int descriptor, const ControlValue& value) {
   while (::ioctl(descriptor, VIDIOC_S_EXT_CTRLS, &controls) < 0 && errno == EINTR) continue;
 }
 
-void guardControlsUntilEnd(int connection, int device, const ControlValue* values, std::size_t count,
+void guardControlsUntilEnd(const GuardDescriptors& descriptors, const ControlValue* values, std::size_t count,
                            ControlSetter set) {
-  await(connection);
-  for (std::size_t i = 0; i < count; ++i) set(device, values[i]);
+  std::array<pollfd, 2> ends{{{descriptors.connection, POLLIN, 0}, {descriptors.guarded, POLLIN, 0}}};
+  while (::poll(ends.data(), ends.size(), -1) < 0 && errno == EINTR) continue;
+  for (std::size_t i = 0; i < count; ++i) set(descriptors.device, values[i]);
 }
 
 std::unique_ptr<ControlGuard> startProjectorGuard(const std::string& path, const std::vector<ControlValue>& values,
                                                   ControlSetter set, int* number) {
   // Opened anew: a copy of our descriptor would keep its buffers in use after we have closed it.
   const FileDescriptor device(::open(path.c_str(), O_RDWR | O_NONBLOCK | O_CLOEXEC));
-  if (!device) {
+  const FileDescriptor guarded(device ? static_cast<int>(::syscall(SYS_pidfd_open, ::getpid(), 0U)) : -1);
+  std::array<int, 2> ends{-1, -1};
+  if (!guarded || ::socketpair(AF_UNIX, SOCK_STREAM | SOCK_CLOEXEC, 0, ends.data()) != 0) {
     *number = errno;
     return nullptr;
   }
-  Connection life;
-  Connection ready;
-  *number = connect(life);
-  if (*number == 0) *number = connect(ready);
-  if (*number != 0) return nullptr;
+  FileDescriptor ours(ends[0]);
+  FileDescriptor theirs(ends[1]);
 
   // The guard is born with all signals blocked: one that came before it could block them would end it.
   sigset_t all;
@@ -125,15 +109,20 @@ std::unique_ptr<ControlGuard> startProjectorGuard(const std::string& path, const
   sigfillset(&all);
   ::pthread_sigmask(SIG_SETMASK, &all, &before);
   const pid_t process = ::fork();
-  if (process == 0) becomeGuard(life.theirs.get(), device.get(), values, set);
+  if (process == 0) becomeGuard({theirs.get(), guarded.get(), device.get()}, values, set);
   *number = process < 0 ? errno : 0;
   ::pthread_sigmask(SIG_SETMASK, &before, nullptr);
   if (process < 0) return nullptr;
 
   // Until the guard has closed what it inherited, it keeps our devices open.
-  ready.theirs.reset();
-  await(ready.ours.get());
-  return std::make_unique<ProjectorGuard>(process, std::move(life.ours));
+  theirs.reset();
+  char ready = 0;
+  ssize_t said = -1;
+  while ((said = ::read(ours.get(), &ready, 1)) < 0 && errno == EINTR) continue;
+  auto guard = std::make_unique<ProjectorGuard>(process, std::move(ours));
+  if (said == 1) return guard;
+  *number = ECHILD;  // it was ended before it was ready
+  return nullptr;
 }
 
 }  // namespace quazor

@@ -3,6 +3,7 @@
 #include <fcntl.h>
 #include <signal.h>
 #include <sys/prctl.h>
+#include <sys/resource.h>
 #include <sys/socket.h>
 #include <sys/wait.h>
 #include <unistd.h>
@@ -120,6 +121,23 @@ TEST(ProjectorGuardTest, SetsTheValuesWhenItsProcessExitsWithoutDestroyingIt) {
   ::waitpid(guard, nullptr, 0);
 }
 
+TEST(ProjectorGuardTest, SetsTheValuesWhenItsProcessIsKilledThoughACopyOfThatLivesOn) {
+  const Device device;
+  const pid_t guard = processThatEnds(device, [] {
+    if (::fork() == 0) {  // it has the connection too
+      ::alarm(10);
+      ::pause();
+    }
+    ::raise(SIGKILL);
+  });
+  EXPECT_EQ(device.contentOnceIs("a5 b0 "), "a5 b0 ");
+  EXPECT_EQ(::waitpid(guard, nullptr, 0), guard);
+  const pid_t copy = childOf(::getpid());
+  ASSERT_NE(copy, 0);
+  ::kill(copy, SIGKILL);
+  EXPECT_EQ(::waitpid(copy, nullptr, 0), copy);
+}
+
 TEST(ProjectorGuardTest, SignalsThatCanBeBlockedDoNotEndIt) {
   const Device device;
   std::unique_ptr<ControlGuard> guard = guardOf(device);
@@ -132,9 +150,11 @@ TEST(ProjectorGuardTest, SignalsThatCanBeBlockedDoNotEndIt) {
   EXPECT_EQ(device.content(), "a5 b0 ");
 }
 
-TEST(ProjectorGuardTest, HasNoDescriptorsButItsTwo) {
+TEST(ProjectorGuardTest, HasNoDescriptorsButItsThree) {
   const Device device;
   const int open = ::open("/dev/null", O_RDONLY);
+  const int above = ::fcntl(open, F_DUPFD, 200);
+  ASSERT_GE(above, 200);
   const std::unique_ptr<ControlGuard> guard = guardOf(device);
   const std::filesystem::path process = "/proc/" + std::to_string(childOf(::getpid()));
   std::string held;
@@ -144,13 +164,15 @@ TEST(ProjectorGuardTest, HasNoDescriptorsButItsTwo) {
     held += std::filesystem::read_symlink(entry.path(), problem).string() + " ";
     ++count;
   }
-  EXPECT_EQ(count, 2) << held;
+  EXPECT_EQ(count, 3) << held;
   EXPECT_NE(held.find(device.path()), std::string::npos) << held;
   EXPECT_NE(held.find("socket:"), std::string::npos) << held;
+  EXPECT_NE(held.find("pidfd"), std::string::npos) << held;
   std::ifstream name(process / "comm");
   std::string line;
   std::getline(name, line);
   EXPECT_EQ(line, kProjectorGuardName);
+  ::close(above);
   ::close(open);
 }
 
@@ -185,6 +207,10 @@ TEST(ProjectorGuardTest, ADeviceThatCannotBeOpenedIsRefused) {
 
 TEST(ProjectorGuardTest, ASystemWithoutFurtherDescriptorsIsRefused) {
   const Device device;
+  rlimit before{};
+  ::getrlimit(RLIMIT_NOFILE, &before);
+  const rlimit few{64, before.rlim_max};
+  ::setrlimit(RLIMIT_NOFILE, &few);
   std::vector<int> held;
   for (int one = 0; (one = ::open("/dev/null", O_RDONLY)) >= 0;) held.push_back(one);
   const auto refused = [&](std::size_t left) {
@@ -195,9 +221,27 @@ TEST(ProjectorGuardTest, ASystemWithoutFurtherDescriptorsIsRefused) {
     return number;
   };
   EXPECT_EQ(refused(0), EMFILE) << "the device";
-  EXPECT_EQ(refused(1), EMFILE) << "the connection";
-  EXPECT_EQ(refused(3), EMFILE) << "the other connection";
+  EXPECT_EQ(refused(1), EMFILE) << "the end of this process";
+  EXPECT_EQ(refused(2), EMFILE) << "the connection";
   for (const int one : held) ::close(one);
+  ::setrlimit(RLIMIT_NOFILE, &before);
+}
+
+bool endsCopies = false;
+
+TEST(ProjectorGuardTest, OneThatIsEndedBeforeItIsReadyIsRefused) {
+  const Device device;
+  ASSERT_EQ(::pthread_atfork(nullptr, nullptr,
+                             [] {
+                               if (endsCopies) ::_exit(1);
+                             }),
+            0);
+  endsCopies = true;
+  int number = 0;
+  EXPECT_EQ(startProjectorGuard(device.path(), kOff, &note, &number), nullptr);
+  endsCopies = false;
+  EXPECT_EQ(number, ECHILD);
+  EXPECT_EQ(childOf(::getpid()), 0) << "no process is left";
 }
 
 TEST(ProjectorGuardTest, ItsWorkBeginsWithTheEndOfTheConnectionOrAByte) {
@@ -207,7 +251,7 @@ TEST(ProjectorGuardTest, ItsWorkBeginsWithTheEndOfTheConnectionOrAByte) {
     int ends[2];
     ASSERT_EQ(::socketpair(AF_UNIX, SOCK_STREAM, 0, ends), 0);
     EXPECT_EQ(says ? ::send(ends[0], "", 1, 0) : ::close(ends[0]), says ? 1 : 0);
-    guardControlsUntilEnd(ends[1], file, kOff.data(), kOff.size(), &note);
+    guardControlsUntilEnd({ends[1], -1, file}, kOff.data(), kOff.size(), &note);
     EXPECT_EQ(device.content(), "a5 b0 ");
     if (says) ::close(ends[0]);
     ::close(ends[1]);

@@ -15,16 +15,6 @@
 namespace quazor {
 namespace {
 
-// Makes the call until no signal interrupts it. Its result, or the negated error number.
-template <class Call>
-int uninterrupted(Call&& call) {
-  for (;;) {
-    const int result = call();
-    if (result >= 0) return result;
-    if (errno != EINTR) return -errno;
-  }
-}
-
 class SystemVideoKernel final : public VideoKernel {
  public:
   int open(const std::string& path) override {

@@ -3,6 +3,7 @@
 
 #include <poll.h>
 
+#include <cerrno>
 #include <chrono>
 #include <cstddef>
 #include <cstdint>
@@ -64,6 +65,16 @@ class VideoKernel {
   virtual std::unique_ptr<ControlGuard> guardControls(const std::string& path, const std::vector<ControlValue>& off,
                                                       int* number) = 0;
 };
+
+// Makes a call of the system until no signal interrupts it. Its result, or the negated error number.
+template <class Call>
+int uninterrupted(Call&& call) {
+  int result = 0;
+  do {
+    result = call();
+  } while (result < 0 && errno == EINTR);
+  return result < 0 ? -errno : result;
+}
 
 // The running system's.
 std::shared_ptr<VideoKernel> systemVideoKernel();

@@ -6,6 +6,7 @@
 #include <fcntl.h>
 #include <linux/videodev2.h>
 #include <signal.h>
+#include <sys/resource.h>
 #include <sys/wait.h>
 #include <unistd.h>
 
@@ -24,6 +25,22 @@ namespace quazor {
 namespace {
 
 using namespace std::chrono_literals;
+
+// Few descriptors may be open while it lives.
+class FewDescriptors {
+ public:
+  FewDescriptors() {
+    ::getrlimit(RLIMIT_NOFILE, &before_);
+    const rlimit few{kMost, before_.rlim_max};
+    ::setrlimit(RLIMIT_NOFILE, &few);
+  }
+  ~FewDescriptors() { ::setrlimit(RLIMIT_NOFILE, &before_); }
+
+  static constexpr rlim_t kMost = 64;
+
+ private:
+  rlimit before_{};
+};
 
 class SystemVideoKernelTest : public testing::Test {
  protected:
@@ -104,6 +121,7 @@ TEST_F(SystemVideoKernelTest, AnEventIsReadableFromItsSignalUntilItIsCleared) {
 }
 
 TEST_F(SystemVideoKernelTest, ASystemWithoutFurtherDescriptorsIsTold) {
+  const FewDescriptors few;
   std::vector<int> held;
   for (int one = 0; (one = ::open("/dev/null", O_RDONLY)) >= 0;) held.push_back(one);
   EXPECT_EQ(kernel_->makeEvent(), -EMFILE);
@@ -134,8 +152,23 @@ TEST_F(SystemVideoKernelTest, ASignalThatInterruptsAWaitIsAnEarlyReturn) {
 }
 
 TEST_F(SystemVideoKernelTest, ADescriptorTooManyIsAnErrorOfTheWait) {
-  std::vector<pollfd> many(2'000'000, pollfd{-1, POLLIN, 0});
+  const FewDescriptors few;
+  std::vector<pollfd> many(FewDescriptors::kMost + 1, pollfd{-1, POLLIN, 0});
   EXPECT_EQ(kernel_->poll(many, 0ns), -EINVAL);
+}
+
+TEST(UninterruptedTest, ACallThatSignalsInterruptIsMadeAgainAndTellsItsErrorNumber) {
+  int calls = 0;
+  const auto call = [&calls](int result, int number) {
+    return uninterrupted([&, result, number] {
+      errno = ++calls < 3 ? EINTR : number;
+      return calls < 3 ? -1 : result;
+    });
+  };
+  EXPECT_EQ(call(7, 0), 7);
+  EXPECT_EQ(calls, 3);
+  EXPECT_EQ(call(-1, EIO), -EIO);
+  EXPECT_EQ(calls, 4);
 }
 
 TEST_F(SystemVideoKernelTest, GuardsDevices) {

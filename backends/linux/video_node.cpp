@@ -45,6 +45,11 @@ std::string textOf(FrameInterval interval) {
   return formatMessage("%@/%@ s", interval.numerator, interval.denominator);
 }
 
+bool takes(const VideoControl& control, std::int64_t value) {
+  const bool hasRange = control.type != V4L2_CTRL_TYPE_BUTTON && control.type != V4L2_CTRL_TYPE_BITMASK;
+  return !hasRange || (value >= control.lowest && value <= control.highest);
+}
+
 ControlValue valueFor(const VideoControl& control, std::int64_t value) { return {control.id, value, is64Bit(control)}; }
 
 std::shared_ptr<OpenedVideoNode> OpenedVideoNode::open(std::shared_ptr<VideoKernel> kernel, const std::string& path,
@@ -162,17 +167,18 @@ bool OpenedVideoNode::setFormat(std::uint32_t index, std::uint32_t width, std::u
   wanted.fmt.pix.height = height;
   wanted.fmt.pix.pixelformat = description.pixelformat;
   wanted.fmt.pix.field = V4L2_FIELD_ANY;
-  v4l2_format offered = wanted;
-  if (!call(VIDIOC_TRY_FMT, "VIDIOC_TRY_FMT", &offered, error)) return false;
-  const v4l2_pix_format& given = offered.fmt.pix;
-  if (given.width != width || given.height != height || given.pixelformat != description.pixelformat) {
+  // The answer to the second may differ from that to the first, when something else of the device has changed.
+  const auto isGranted = [&](const v4l2_pix_format& given) {
+    if (given.width == width && given.height == height && given.pixelformat == description.pixelformat) return true;
     failLinux(error, LinuxErrorCode::kNotSupported,
               formatMessage("%@: format %@ (%@) of %@ x %@ is not to be had; the driver offers %@ of %@ x %@.", path_,
                             index, codeText(description.pixelformat), width, height, codeText(given.pixelformat),
                             given.width, given.height));
     return false;
-  }
-  return call(VIDIOC_S_FMT, "VIDIOC_S_FMT", &wanted, error);
+  };
+  v4l2_format offered = wanted;
+  return call(VIDIOC_TRY_FMT, "VIDIOC_TRY_FMT", &offered, error) && isGranted(offered.fmt.pix) &&
+         call(VIDIOC_S_FMT, "VIDIOC_S_FMT", &wanted, error) && isGranted(wanted.fmt.pix);
 }
 
 std::optional<FrameInterval> OpenedVideoNode::interval(DiagnosticErrorPtr* error) const {
@@ -226,8 +232,7 @@ std::optional<std::int64_t> OpenedVideoNode::read(const VideoControl& control, D
 }
 
 bool OpenedVideoNode::set(const VideoControl& control, std::int64_t value, DiagnosticErrorPtr* error) {
-  const bool hasRange = control.type != V4L2_CTRL_TYPE_BUTTON && control.type != V4L2_CTRL_TYPE_BITMASK;
-  if (hasRange && (value < control.lowest || value > control.highest)) {
+  if (!takes(control, value)) {
     failLinux(error, LinuxErrorCode::kBadValue,
               formatMessage("%@: the control \"%@\" takes %@ to %@, not %@.", path_, control.name, control.lowest,
                             control.highest, value));

@@ -81,6 +81,8 @@ class OpenedVideoNode final {
   std::vector<VideoControl> controls_;
 };
 
+// Whether the value is in the control's range; buttons and sets of bits have none.
+bool takes(const VideoControl& control, std::int64_t value);
 // A control that is to get a value, for VideoKernel.
 ControlValue valueFor(const VideoControl& control, std::int64_t value);
 

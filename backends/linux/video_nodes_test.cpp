@@ -206,6 +206,22 @@ TEST(OpenedVideoNodeTest, ControlsKeepTheirRangesAndTheirWidth) {
   EXPECT_FALSE(valueFor(*node->control("Narrow", nullptr), 1).is64Bit);
 }
 
+TEST(OpenedVideoNodeTest, AFormatThatTheDriverChangesAsItIsSetIsRefused) {
+  class ChangingKernel final : public FakeVideoKernel {
+   public:
+    int ioctl(int descriptor, unsigned long request, void* argument) override {
+      const int result = FakeVideoKernel::ioctl(descriptor, request, argument);
+      if (request == VIDIOC_S_FMT) static_cast<v4l2_format*>(argument)->fmt.pix.height = 352;
+      return result;
+    }
+  };
+  const auto kernel = std::make_shared<ChangingKernel>();
+  const std::string path = kernel->add(0, fakeCamera("fake:0"));
+  const auto node = OpenedVideoNode::open(kernel, path, nullptr);
+  EXPECT_EQ(outcome([&](auto* error) { return node->setFormat(1, 640, 360, error); }),
+            "5 " + path + ": format 1 (GREY) of 640 x 360 is not to be had; the driver offers GREY of 640 x 352.");
+}
+
 TEST(OpenedVideoNodeTest, ADriverWithoutCapabilitiesOfItsNodesIsTakenByTheDevices) {
   class OldKernel final : public FakeVideoKernel {
    public:
