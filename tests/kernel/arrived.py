@@ -5,6 +5,11 @@ import re
 
 KERNEL_COMPLAINT = re.compile(r"BUG:|WARNING:|Oops|Call Trace|blocked for more than|general protection|Out of memory")
 
+# The address sanitizer says so, once, of a program that switches between stacks, as the simulated phone does. It found
+# nothing.
+SANITIZER_REMARK = re.compile(r"^==\d+==WARNING: ASan doesn't fully support makecontext/swapcontext functions and may "
+                              r"produce false positives in some cases!$", re.MULTILINE)
+
 
 class CheckFailed(Exception):
     """A sentence that says what is not as expected."""
@@ -84,17 +89,18 @@ class Arrived:
         expect_equal("the exit code of the script", self.text("exit").strip(), "0")
         expect_equal("the closing line", self._parcel.text("closed").strip(), f"closed {self.name}")
         expect_equal("what was left running", self.text("leftovers"), "")
-        found = sorted(file for file in self.files if file.startswith("found."))
-        expect(not found, "a sanitizer found: " + " ".join(self.text(file) for file in found))
+        found = (self.text(file) for file in sorted(self.files) if file.startswith("found."))
+        findings = " ".join(SANITIZER_REMARK.sub("", text).strip() for text in found).strip()
+        expect(not findings, f"a sanitizer found: {findings}")
         complaint = KERNEL_COMPLAINT.search(self.text("kernel.log"))
         expect(complaint is None, f"the kernel complains: {self.text('kernel.log')}")
 
 
 def failure_of(entry):
-    """Why a diagnostic did not pass, in a line."""
+    """Why a diagnostic did not pass, in a line. Experiments judge no results."""
     if entry["error"]:
         return json.dumps(entry["error"])
-    return "; ".join(f"{result['name']} is {result['value']}" for result in entry["measuredResults"]
+    return "; ".join(f"{result['name']} is {result['value']}" for result in entry.get("measuredResults", [])
                      if result["verdict"] == "fail")
 
 

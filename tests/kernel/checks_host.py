@@ -4,7 +4,8 @@ import json
 
 from arrived import expect, expect_equal
 
-DIAGNOSTICS = ("CameraSyncDiagnostic.Back", "CameraSyncDiagnostic.Front", "TesselFaultDiagnostic", "TesselTelemonDiagnostic")
+DIAGNOSTICS = ("CameraSyncDiagnostic.Back", "CameraSyncDiagnostic.Front", "TesselFaultDiagnostic",
+               "TesselTelemonDiagnostic")
 
 
 def simulated_phone(step):
@@ -15,7 +16,10 @@ def simulated_phone(step):
 
 def nothing(step):
     expect_equal("the exit code of a probe", step.exit_code("probe"), 0)
-    expect(step.out("probe").strip(), "the probe says nothing")
+    for kind in ("Cameras", "HID devices", "Displays"):
+        expect(f"{kind}\n  none: " in step.out("probe"), f"the probe does not say that there are no {kind}")
+    _, _, binding = step.out("probe").partition("\n{")
+    expect("cameras" not in json.loads("{" + binding), "the probe's binding has cameras")
     for label, code in (("back", 200), ("fault", 200)):
         expect_equal(f"the verdict of {label}", step.ran(label)["verdict"], "error")
     step.ended_in_error("channels", "QZErrorDomain", 6)

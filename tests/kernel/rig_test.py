@@ -5,8 +5,10 @@ import contextlib
 import io
 import pathlib
 import shlex
+import subprocess
 import sys
 import tempfile
+import time
 import types
 import unittest
 
@@ -18,6 +20,8 @@ from steps import STEPS, Step
 
 HERE = pathlib.Path(__file__).resolve().parent
 WHOLE = {"exit": "0\n", "leftovers": "", "kernel.log": "", "log": "a line of the log\n", "began": "1", "ended": "2"}
+REMARK = ("==77==WARNING: ASan doesn't fully support makecontext/swapcontext functions and may produce false positives "
+          "in some cases!")
 END = parcel("end", archive_of({}))
 
 
@@ -57,6 +61,9 @@ class RigTest(unittest.TestCase):
         self.assertRegex(printed, r"pass .*boot-1: one: something\npass .*boot-1: two")
         self.assertEqual((self.results / "boot-1/one/log").read_text(), "a line of the log\n")
 
+    def test_a_remark_of_a_sanitizer_is_no_finding(self):
+        self.assertEqual(self.run_machine(sent("one", found_77=REMARK + "\n") + END)[1], [])
+
     def test_what_makes_a_step_fail(self):
         rows = {
             "no closing line": ({"closed": None}, "the closing line is ''"),
@@ -66,6 +73,8 @@ class RigTest(unittest.TestCase):
             "a process that is left": ({"leftovers": "/proc/7 quazor\n"}, "left running"),
             "a kernel's complaint": ({"kernel_log": "[ 1.0] WARNING: CPU: 0\n"}, "the kernel complains"),
             "what a sanitizer found": ({"found_77": "heap-use-after-free\n"}, "a sanitizer found: heap-use-after-free"),
+            "what it found after a remark": ({"found_77": f"{REMARK}\nstack-overflow\n"},
+                                             "a sanitizer found: stack-overflow"),
             "no kernel log": ({"kernel_log": None}, "there is no kernel.log"),
         }
         for name, (changes, sentence) in rows.items():
@@ -107,9 +116,25 @@ class RigTest(unittest.TestCase):
                 self.assertIn("the machine ended by itself", printed)
 
     def test_a_machine_that_hangs_is_killed_and_has_failed(self):
-        printed, failed = self.run_machine(sent("one"), ("one", "two"), seconds=0.3, after="exec sleep 60")
-        self.assertEqual(failed, ["two", "(the boot)"])
-        self.assertIn("did not end in 0 s", printed)
+        for how, after in (("waits", "exec sleep 60"), ("works", "while :; do :; done")):
+            with self.subTest(how):
+                printed, failed = self.run_machine(sent("one"), ("one", "two"), seconds=0.5, after=after)
+                self.assertEqual(failed, ["two", "(the boot)"])
+                self.assertIn("did not end in 0.5 s of processor time", printed)
+
+    def test_the_processor_time_of_a_machine_is_told(self):
+        with subprocess.Popen(["sh", "-c", "while :; do :; done"]) as process:
+            try:
+                while machine.processor_seconds(process.pid) < 0.2:
+                    time.sleep(0.05)
+            finally:
+                process.kill()
+        with subprocess.Popen(["sleep", "60"]) as process:
+            try:
+                time.sleep(0.2)
+                self.assertLess(machine.processor_seconds(process.pid), 0.1)
+            finally:
+                process.kill()
 
     def test_what_an_earlier_machine_sent_does_not_count(self):
         (self.results / "boot-1").mkdir()
