@@ -16,6 +16,7 @@ namespace {
 
 using Json = nlohmann::ordered_json;
 
+constexpr std::size_t kLargestFile = 16U << 20;  // a device may have no end
 // Deeper than any document. Bounds the recursion of whoever walks the document.
 constexpr std::size_t kDeepest = 32;
 
@@ -211,6 +212,7 @@ std::string readTextFile(const std::filesystem::path& file) {
   std::array<char, 65536> piece;  // read() notes a failure where iterators throw
   while (stream.read(piece.data(), piece.size()) || stream.gcount() > 0) {
     text.append(piece.data(), static_cast<std::size_t>(stream.gcount()));
+    if (text.size() > kLargestFile) throw JsonProblem(name + ": the file is larger than 16 MiB.");
   }
   if (stream.bad()) throw JsonProblem(name + ": the file cannot be read.");
   return text;

@@ -38,7 +38,7 @@ nlohmann::ordered_json parseJson(std::string_view text, const std::string& name)
 // key that it has; 1 where there is none. Parses the text once more: for what goes wrong.
 std::size_t lineOfPath(std::string_view text, const std::string& path);
 
-// The text of a file. Throws JsonProblem where it cannot be read.
+// The text of a file. Throws JsonProblem where it cannot be read, or is larger than 16 MiB.
 std::string readTextFile(const std::filesystem::path& file);
 
 // The document in a file. Throws JsonProblem, also for a file that cannot be read.

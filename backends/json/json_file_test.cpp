@@ -71,6 +71,7 @@ TEST(ReadTextFile, SaysWhyAFileCannotBeRead) {
   };
   EXPECT_EQ(problemWith("/dev/null"), "read: ");
   EXPECT_EQ(problemWith("/proc/self/mem"), "/proc/self/mem: the file cannot be read.");
+  EXPECT_EQ(problemWith("/dev/zero"), "/dev/zero: the file is larger than 16 MiB.");
   EXPECT_EQ(problemWith("/proc"), "/proc: this is a directory, not a file.");
   EXPECT_EQ(problemWith("/proc/nothing"), "/proc/nothing: there is no such file.");
 }

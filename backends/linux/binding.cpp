@@ -19,9 +19,26 @@ constexpr std::array kPorts{port_type::BackFacingCamera, port_type::BackFacingTe
                             port_type::FrontFacingInfraredCamera};
 constexpr std::uint64_t kLargestSide = 65536;
 constexpr std::uint64_t kFewestBuffers = 2;
-constexpr std::uint64_t kMostBuffers = 32;             // VIDEO_MAX_FRAME of linux/videodev2.h
-constexpr std::size_t kLongestControlName = 31;        // v4l2_query_ext_ctrl has 32 bytes for it and its end
+constexpr std::uint64_t kMostBuffers = 32;       // VIDEO_MAX_FRAME of linux/videodev2.h
+constexpr std::size_t kLongestControlName = 31;  // v4l2_query_ext_ctrl has 32 bytes for it and its end
+constexpr std::size_t kLongestDriver = 15;       // v4l2_capability, likewise
+constexpr std::size_t kLongestCard = 31;
+constexpr std::size_t kLongestBusInfo = 31;
 constexpr std::uint64_t kLastMetadataByte = 16777215;  // of a buffer
+
+// A key that means nothing, but must be a text where it is there.
+void checkRemark(const JsonCursor& cursor, std::string_view key) {
+  if (const auto remark = cursor.find(key)) static_cast<void>(remark->text());
+}
+
+// All entries of an object whose keys are names.
+std::vector<std::pair<std::string, JsonCursor>> namedEntries(const JsonCursor& cursor) {
+  std::vector<std::pair<std::string, JsonCursor>> entries = cursor.entries();
+  for (const auto& [name, ignored] : entries) {
+    if (name.empty()) cursor.fail("an entry has no name; give it one.");
+  }
+  return entries;
+}
 
 std::string readControlName(const std::string& name, const JsonCursor& cursor) {
   if (name.size() <= kLongestControlName) return name;
@@ -29,9 +46,15 @@ std::string readControlName(const std::string& name, const JsonCursor& cursor) {
               " characters.");
 }
 
-std::optional<std::string> findText(const JsonCursor& cursor, std::string_view key) {
+std::optional<std::string> findDeviceText(const JsonCursor& cursor, std::string_view key, std::size_t longest) {
   const std::optional<JsonCursor> found = cursor.find(key);
-  return found ? std::optional(found->text()) : std::nullopt;
+  if (!found) return std::nullopt;
+  std::string text = found->text();
+  if (text.size() > longest) {
+    found->fail("no driver tells more than " + std::to_string(longest) + " characters here, and this has " +
+                std::to_string(text.size()) + "; quazor phone probe shows what it tells.");
+  }
+  return text;
 }
 
 std::optional<std::string> findControl(const JsonCursor& cursor, std::string_view key) {
@@ -41,7 +64,8 @@ std::optional<std::string> findControl(const JsonCursor& cursor, std::string_vie
 
 VideoNodeMatch readMatch(const JsonCursor& cursor) {
   cursor.allowKeys({"driver", "card", "busInfo"});
-  VideoNodeMatch match{findText(cursor, "driver"), findText(cursor, "card"), findText(cursor, "busInfo")};
+  VideoNodeMatch match{findDeviceText(cursor, "driver", kLongestDriver), findDeviceText(cursor, "card", kLongestCard),
+                       findDeviceText(cursor, "busInfo", kLongestBusInfo)};
   if (!match.driver && !match.card && !match.busInfo) {
     cursor.fail("give at least one of \"driver\", \"card\" and \"busInfo\"; quazor phone probe shows them.");
   }
@@ -50,7 +74,7 @@ VideoNodeMatch readMatch(const JsonCursor& cursor) {
 
 std::vector<ControlSetting> readSettings(const JsonCursor& cursor) {
   std::vector<ControlSetting> settings;
-  for (const auto& [name, value] : cursor.entries()) {
+  for (const auto& [name, value] : namedEntries(cursor)) {
     settings.push_back(
         {readControlName(name, value), value.isBoolean() ? std::int64_t{value.boolean()} : value.integer()});
   }
@@ -69,7 +93,10 @@ MetadataField readField(const std::string& key, const JsonCursor& cursor) {
   if (const auto shift = cursor.find("shift")) {
     field.shift = static_cast<std::uint32_t>(shift->integer(0, field.bytes * 8U - 1));
   }
-  if (const auto mask = cursor.find("mask")) field.mask = mask->integer(1, std::numeric_limits<std::uint64_t>::max());
+  if (const auto mask = cursor.find("mask")) {
+    const std::uint32_t bits = field.bytes * 8U - field.shift;  // that are left of the number
+    field.mask = mask->integer(1, std::numeric_limits<std::uint64_t>::max() >> (64U - bits));
+  }
   return field;
 }
 
@@ -77,18 +104,18 @@ MetadataBinding readMetadata(const JsonCursor& cursor) {
   cursor.allowKeys({"constants", "node", "fields", "controls"});
   MetadataBinding metadata;
   if (const auto constants = cursor.find("constants")) {
-    for (const auto& [key, value] : constants->entries()) metadata.constants.set(key, value.scalar());
+    for (const auto& [key, value] : namedEntries(*constants)) metadata.constants.set(key, value.scalar());
   }
   if (const auto node = cursor.find("node")) metadata.node = readMatch(*node);
   if (const auto fields = cursor.find("fields")) {
     if (!metadata.node) fields->fail("there is no metadata node to read them from; say by \"node\" which one it is.");
-    for (const auto& [key, value] : fields->entries()) metadata.fields.push_back(readField(key, value));
+    for (const auto& [key, value] : namedEntries(*fields)) metadata.fields.push_back(readField(key, value));
   }
   if (metadata.node && metadata.fields.empty()) {
     cursor.at("node").fail("nothing is read from the metadata node; say by \"fields\" what is, or leave it out.");
   }
   if (const auto controls = cursor.find("controls")) {
-    for (const auto& [key, value] : controls->entries()) {
+    for (const auto& [key, value] : namedEntries(*controls)) {
       metadata.controls.push_back({key, readControlName(value.text(), value)});
     }
   }
@@ -116,10 +143,7 @@ ErrorCounterBinding readErrorCounter(const std::string& name, const JsonCursor& 
   ErrorCounterBinding counter;
   counter.name = name;
   counter.control = findControl(cursor, "control");
-  if (const auto file = cursor.find("file")) {
-    counter.file = file->text();
-    if (!counter.file->is_absolute()) file->fail("must be an absolute path, as \"/sys/...\".");
-  }
+  if (const auto file = cursor.find("file")) counter.file = readPathText(*file);
   if (counter.file.has_value() == counter.control.has_value()) {
     cursor.fail("give either \"file\" or \"control\": where the count is read.");
   }
@@ -131,6 +155,7 @@ CameraBinding readCamera(const std::string& port, const JsonCursor& cursor) {
     cursor.fail(inQuotes(port) + " is not a port" + suggestion(port, kPorts));
   }
   cursor.allowKeys({"description", "node", "size", "buffers", "controls", "metadata", "projector", "errorCounters"});
+  checkRemark(cursor, "description");
   CameraBinding camera;
   camera.port = port;
   camera.node = readMatch(cursor.at("node"));
@@ -145,7 +170,9 @@ CameraBinding readCamera(const std::string& port, const JsonCursor& cursor) {
   if (const auto metadata = cursor.find("metadata")) camera.metadata = readMetadata(*metadata);
   if (const auto projector = cursor.find("projector")) camera.projector = readProjector(*projector);
   if (const auto counters = cursor.find("errorCounters")) {
-    for (const auto& [name, value] : counters->entries()) camera.errorCounters.push_back(readErrorCounter(name, value));
+    for (const auto& [name, value] : namedEntries(*counters)) {
+      camera.errorCounters.push_back(readErrorCounter(name, value));
+    }
   }
   return camera;
 }
@@ -166,7 +193,9 @@ std::vector<CameraBinding> readCameras(const JsonCursor& cursor) {
 
 GroupBinding readGroup(const JsonCursor& cursor, const std::vector<CameraBinding>& cameras) {
   cursor.allowKeys({"description", "cameras", "master"});
+  checkRemark(cursor, "description");
   std::vector<std::string_view> ports;
+  ports.reserve(cameras.size());
   for (const CameraBinding& camera : cameras) ports.push_back(camera.port);
   GroupBinding group;
   for (const JsonCursor& element : cursor.at("cameras").elements()) {
@@ -183,6 +212,8 @@ GroupBinding readGroup(const JsonCursor& cursor, const std::vector<CameraBinding
 Binding bindingOf(const JsonCursor& document) {
   document.allowKeys(
       {"$schema", "title", "description", "cameras", "groups", "counterFiles", "tracepoints", "display"});
+  checkRemark(document, "$schema");
+  checkRemark(document, "description");
   Binding binding;
   binding.title = document.at("title").text();
   if (const auto cameras = document.find("cameras")) binding.cameras = readCameras(*cameras);
@@ -191,14 +222,11 @@ Binding bindingOf(const JsonCursor& document) {
       binding.groups.push_back(readGroup(group, binding.cameras));
     }
   }
-  if (const auto files = document.find("counterFiles")) {
-    for (const JsonCursor& element : files->elements()) binding.counterFiles.push_back(readCounterFiles(element));
-  }
-  if (const auto tracepoints = document.find("tracepoints")) {
-    for (const JsonCursor& element : tracepoints->elements()) binding.tracepoints.push_back(readTracepoints(element));
-  }
+  if (const auto files = document.find("counterFiles")) binding.counterFiles = readAllCounterFiles(*files);
+  if (const auto tracepoints = document.find("tracepoints")) binding.tracepoints = readAllTracepoints(*tracepoints);
   if (const auto display = document.find("display")) {
     display->allowKeys({"description", "connector"});
+    checkRemark(*display, "description");
     const JsonCursor connector = display->at("connector");
     binding.display = DisplayBinding{connector.text()};
     if (binding.display->connector.find('/') != std::string::npos || binding.display->connector.starts_with("card")) {

@@ -4,10 +4,15 @@
 #include "backends/json/json_cursor.h"
 #include "backends/linux/binding.h"
 
+#include <string>
+#include <vector>
+
 namespace quazor {
 
-// Both throw JsonProblem: "PATH: ...".
-CounterFilesBinding readCounterFiles(const JsonCursor& cursor);
-TracepointBinding readTracepoints(const JsonCursor& cursor);
+// All throw JsonProblem: "PATH: ...".
+std::vector<CounterFilesBinding> readAllCounterFiles(const JsonCursor& cursor);
+std::vector<TracepointBinding> readAllTracepoints(const JsonCursor& cursor);
+// An absolute path that a system call can take, without components that lead back.
+std::string readPathText(const JsonCursor& cursor);
 
 }  // namespace quazor

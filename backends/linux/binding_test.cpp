@@ -79,7 +79,7 @@ TEST_F(BindingTest, ReadsAllThereIsToSay) {
         "metadata": {
           "constants": {"I": 1, "D": 0.5, "S": "s", "B": true},
           "node": {"card": "meta"},
-          "fields": {"F": {"offset": 3, "bytes": 8, "shift": 63, "mask": 18446744073709551615}, "G": {"offset": 0}},
+          "fields": {"F": {"offset": 3, "bytes": 8, "shift": 0, "mask": 18446744073709551615}, "G": {"offset": 0}, "H": {"offset": 4, "bytes": 8, "shift": 63, "mask": 1}},
           "controls": {"K": "Gain"}
         },
         "projector": {"on": {"L": 1}, "off": {"L": 0, "M": 0}, "modeControl": "m", "patternControl": "p",
@@ -117,14 +117,16 @@ TEST_F(BindingTest, ReadsAllThereIsToSay) {
   const Dictionary constants{{"I", std::int64_t{1}}, {"D", 0.5}, {"S", "s"}, {"B", true}};
   EXPECT_EQ(camera.metadata.constants, constants);
   EXPECT_EQ(camera.metadata.node, (VideoNodeMatch{std::nullopt, "meta", std::nullopt}));
-  ASSERT_EQ(camera.metadata.fields.size(), 2U);
+  ASSERT_EQ(camera.metadata.fields.size(), 3U);
   EXPECT_EQ(camera.metadata.fields[0].key, "F");
   EXPECT_EQ(camera.metadata.fields[0].offset, 3U);
   EXPECT_EQ(camera.metadata.fields[0].bytes, 8U);
-  EXPECT_EQ(camera.metadata.fields[0].shift, 63U);
+  EXPECT_EQ(camera.metadata.fields[0].shift, 0U);
   EXPECT_EQ(camera.metadata.fields[0].mask, ~std::uint64_t{0});
   EXPECT_EQ(camera.metadata.fields[1].bytes, 1U);
   EXPECT_EQ(camera.metadata.fields[1].mask, std::nullopt);
+  EXPECT_EQ(camera.metadata.fields[2].shift, 63U);
+  EXPECT_EQ(camera.metadata.fields[2].mask, 1U);
   ASSERT_EQ(camera.metadata.controls.size(), 1U);
   EXPECT_EQ(camera.metadata.controls[0].key, "K");
   EXPECT_EQ(camera.metadata.controls[0].control, "Gain");
@@ -218,6 +220,26 @@ TEST_F(BindingTest, RefusesWhatCamerasCannotBe) {
        camera + ".errorCounters.E: give either \"file\" or \"control\": where the count is read."},
       {"a counter from two places", withCamera("\"errorCounters\": {\"E\": {\"file\": \"/a\", \"control\": \"b\"}}"),
        camera + ".errorCounters.E: give either \"file\" or \"control\": where the count is read."},
+      {"a control without a name", withCamera("\"controls\": {\"\": 1}"),
+       camera + ".controls: an entry has no name; give it one."},
+      {"a counter without a name", withCamera("\"errorCounters\": {\"\": {\"control\": \"b\"}}"),
+       camera + ".errorCounters: an entry has no name; give it one."},
+      {"a counter in a file by a way back", withCamera("\"errorCounters\": {\"E\": {\"file\": \"/a/../b\"}}"),
+       camera + ".errorCounters.E.file: must be a path without \"//\", \".\", \"..\" and a \"/\" at its end."},
+      {"a description that is no text", withCamera("\"description\": 5"),
+       camera + ".description: must be a string that is not empty, not 5."},
+      {"a driver that none can have",
+       with(R"("cameras": {"BackFacingCamera": {"node": {"driver": "0123456789abcdef"}}})"),
+       "F:2: cameras.BackFacingCamera.node.driver: no driver tells more than 15 characters here, and this has 16; "
+       "quazor phone probe shows what it tells."},
+      {"a card that none can have",
+       with(R"("cameras": {"BackFacingCamera": {"node": {"card": ")" + std::string(32, 'x') + R"("}}})"),
+       "F:2: cameras.BackFacingCamera.node.card: no driver tells more than 31 characters here, and this has 32; "
+       "quazor phone probe shows what it tells."},
+      {"a bus that none can have",
+       with(R"("cameras": {"BackFacingCamera": {"node": {"busInfo": ")" + std::string(32, 'x') + R"("}}})"),
+       "F:2: cameras.BackFacingCamera.node.busInfo: no driver tells more than 31 characters here, and this has 32; "
+       "quazor phone probe shows what it tells."},
       {"a counter in a relative file", withCamera("\"errorCounters\": {\"E\": {\"file\": \"a\"}}"),
        camera + ".errorCounters.E.file: must be an absolute path, as \"/sys/...\"."},
   };
@@ -243,7 +265,16 @@ TEST_F(BindingTest, RefusesMetadataThatCannotBe) {
       {"everything shifted out", withField("\"offset\": 1, \"bytes\": 2, \"shift\": 16"),
        metadata + ".fields.K.shift: must be an integer from 0 to 15, not 16."},
       {"everything masked out", withField("\"offset\": 1, \"mask\": 0"),
-       metadata + ".fields.K.mask: must be an integer from 1 to 18446744073709551615, not 0."},
+       metadata + ".fields.K.mask: must be an integer from 1 to 255, not 0."},
+      {"a mask of bits that the number does not have",
+       withField(R"("offset": 1, "bytes": 2, "shift": 4, "mask": 4096)"),
+       metadata + ".fields.K.mask: must be an integer from 1 to 4095, not 4096."},
+      {"a constant without a name", withMetadata(R"("constants": {"": 1})"),
+       metadata + ".constants: an entry has no name; give it one."},
+      {"a field without a name", withMetadata(R"("node": {"card": "m"}, "fields": {"": {"offset": 0}})"),
+       metadata + ".fields: an entry has no name; give it one."},
+      {"a control's key without a name", withMetadata(R"("controls": {"": "Gain"})"),
+       metadata + ".controls: an entry has no name; give it one."},
       {"a projector that is never off", withProjector("\"on\": {\"L\": 1}"),
        "F:3: cameras.BackFacingCamera.projector: the key \"off\" is missing."},
       {"nothing to put it out by", withProjector("\"off\": {}"),
@@ -267,6 +298,8 @@ TEST_F(BindingTest, RefusesGroupsThatCannotBe) {
        "F:3: groups.g.cameras[1]: the camera stands twice; leave one."},
       {"another master", withGroup(R"("cameras": ["BackFacingCamera"], "master": "FrontFacingCamera")"),
        "F:3: groups.g.master: \"FrontFacingCamera\" is not a camera of the group; did you mean \"BackFacingCamera\"?"},
+      {"a description that is no text", withGroup("\"description\": []"),
+       "F:3: groups.g.description: must be a string that is not empty, not an array."},
       {"no master", withGroup(R"("cameras": ["BackFacingCamera"])"), "F:3: groups.g: the key \"master\" is missing."},
   };
   for (const Refused& row : kRows) EXPECT_EQ(problemOf(row.text), row.problem) << row.what;
@@ -281,6 +314,24 @@ TEST_F(BindingTest, RefusesCountersThatCannotBe) {
       {"a slash at the end", withPath("/a/"), shape},
       {"the folder itself", withPath("/a/./b"), shape},
       {"the folder above", withPath("/a/../b"), shape},
+      {"a path that is too long", withPath("/" + std::string(4095, 'a')),
+       files + ".path: is longer than a path can be, which is 4095 bytes."},
+      {"a path that ends within", withPath("/a\\u0000b"), files + ".path: no path can hold the character \\u0000."},
+      {"a placeholder outside of the path", withFiles(R"("path": "/a/{name}", "group": "x{name}", "subgroup": "s")"),
+       files + ".group: a placeholder stands for something in the path only; give the group as it is."},
+      {"a description that is no text", withPath("/a", R"("name": "n", "description": 1)"),
+       files + ".description: must be a string that is not empty, not 1."},
+      {"the same files twice", with(R"("counterFiles": [{"path": "/a", "group": "g", "subgroup": "s", "name": "n"},
+                                {"path": "/a", "group": "g", "subgroup": "s", "name": "m"},
+                                {"path": "/a", "group": "g", "subgroup": "s", "name": "m", "description": "d"}])"),
+       "F:4: counterFiles[2]: this is the same as entry 1 of the list; leave one."},
+      {"the same tracepoint twice", with(R"("tracepoints": [{"system": "a", "event": "b"},
+                                                            {"system": "a", "event": "b"}])"),
+       "F:3: tracepoints[1]: this is the same as entry 0 of the list; leave one."},
+      {"a tracepoint's description that is no text", with(R"("tracepoints": [{"description": {}}])"),
+       "F:2: tracepoints[0].description: must be a string that is not empty, not an object."},
+      {"a display's description that is no text", with(R"("display": {"description": 1, "connector": "DSI-1"})"),
+       "F:2: display.description: must be a string that is not empty, not 1."},
       {"an unknown placeholder", withPath("/{nmae}", "\"key\": \"k\""),
        files + ".path: \"/{nmae}\" holds the unknown placeholder \"{nmae}\"; known are \"{group}\", \"{subgroup}\" and "
                "\"{name}\"."},
@@ -305,6 +356,10 @@ TEST_F(BindingTest, RefusesCountersThatCannotBe) {
        files + ".path: this number is no counter: it tells how much there is now, so it goes down too."},
       {"a tracepoint without event", with(R"("tracepoints": [{"system": "a"}])"),
        "F:2: tracepoints[0]: the key \"event\" is missing."},
+      {"a tracepoint's system that leads back", with(R"("tracepoints": [{"system": "..", "event": "a"}])"),
+       "F:2: tracepoints[0].system: must be the name of a folder of tracefs's events, not a path."},
+      {"a tracepoint's event that is a path", with(R"("tracepoints": [{"system": "a", "event": "b/../c"}])"),
+       "F:2: tracepoints[0].event: must be the name of a folder of tracefs's events, not a path."},
       {"a placeholder in a tracepoint", with(R"("tracepoints": [{"system": "{group}", "event": "a"}])"),
        "F:2: tracepoints[0].system: only * stands for any text here, not a placeholder."},
       {"one name for many", with(R"("tracepoints": [{"system": "a", "event": "b*", "name": "n"}])"),
@@ -325,6 +380,9 @@ TEST_F(BindingTest, RefusesWhatIsNoBinding) {
       {"no object", "[]", "F:1: the document: must be an object, not an array."},
       {"no title", "{}", "F:1: the document: the key \"title\" is missing."},
       {"an empty title", "{\n\"title\": \"\"}", "F:2: title: must be a string that is not empty, not \"\"."},
+      {"a description that is no text", with("\"description\": 1"),
+       "F:2: description: must be a string that is not empty, not 1."},
+      {"a schema that is no text", with("\"$schema\": 1"), "F:2: $schema: must be a string that is not empty, not 1."},
       {"an unknown key", with("\"camera\": {}"),
        "F:2: the document: there is no key \"camera\"; did you mean \"cameras\"?"},
   };

@@ -9,6 +9,7 @@
 #include <charconv>
 #include <functional>
 #include <system_error>
+#include <unordered_set>
 #include <utility>
 
 namespace quazor {
@@ -17,7 +18,10 @@ namespace {
 constexpr std::string_view kNameAsKey = "{name}";
 constexpr int kMostProcessors = 65536;
 
-bool isNotThere(int number) { return number == ENOENT || number == ENOTDIR || number == ENODEV; }
+// Also a link that leads to itself leads nowhere.
+bool isNotThere(int number) { return number == ENOENT || number == ENOTDIR || number == ENODEV || number == ELOOP; }
+
+bool isNoAccess(int number) { return number == EACCES || number == EPERM; }
 
 // Looks for the files of a path whose components are patterns.
 class Walk {
@@ -65,9 +69,12 @@ class Walk {
       const std::string found = directory + "/" + entry.name;
       if (!isLast) {
         if (entry.kind != EntryKind::kFile && !below(found, depth + 1, merged(names, std::move(here)))) return false;
-      } else if (entry.kind == EntryKind::kFile || (entry.kind == EntryKind::kOther && system_.find(found) == 0)) {
-        if (!found_(found, merged(names, std::move(here)))) return false;
+        continue;
       }
+      const int failure = entry.kind == EntryKind::kOther ? system_.find(found) : 0;
+      if (failure != 0 && !isNotThere(failure)) return refuse("stat", found, failure);
+      if (failure != 0 || entry.kind == EntryKind::kDirectory) continue;
+      if (!found_(found, merged(names, std::move(here)))) return false;
     }
     return true;
   }
@@ -109,16 +116,13 @@ class Enumeration {
 
   bool add(const TracepointBinding& tracepoints) {
     for (const std::string_view place : kTracingPlaces) {
-      const std::string events = std::string(place) + "/events/";
-      const std::size_t before = channels_.size();
+      const std::string events = std::string(place) + "/events";
+      std::vector<DirectoryEntry> ignored;
+      if (isNotThere(system_.list(events, &ignored))) continue;  // tracefs is not mounted there
       const auto found = [&](const std::string& file, const ChannelNames& /*names*/) {
-        addTracepoint(tracepoints, file, std::string_view(file).substr(events.size()));
-        return true;
+        return addTracepoint(tracepoints, file, std::string_view(file).substr(events.size() + 1));
       };
-      if (!Walk(system_, events + tracepoints.system + "/" + tracepoints.event + "/id", found).run(error_)) {
-        return false;
-      }
-      if (channels_.size() != before) break;
+      return Walk(system_, events + "/" + tracepoints.system + "/" + tracepoints.event + "/id", found).run(error_);
     }
     return true;
   }
@@ -133,24 +137,30 @@ class Enumeration {
   bool addLines(ReportChannelDescription description, const std::string& file) {
     std::string content;
     if (const int failure = system_.read(file, &content); failure != 0) {
-      if (failure != EACCES && failure != EPERM) return true;
-      failSystemCall(error_, "open", file, failure);
-      return false;
+      return !isNoAccess(failure) || refuse(file, failure);
     }
     std::string_view text = content;
+    std::unordered_set<std::string_view> keys;
     while (const std::optional<KeyedLine> line = takeKeyedLine(&text)) {
-      if (!line->count) continue;
+      if (!keys.insert(line->key).second || !line->count) continue;  // of lines with the same key the first one holds
       description.name = line->key;
       addFile(description, file, description.name);
     }
     return true;
   }
 
-  // `path` is SYSTEM/EVENT/id.
-  void addTracepoint(const TracepointBinding& tracepoints, const std::string& file, std::string_view path) {
+  bool refuse(const std::string& file, int failure) {
+    failSystemCall(error_, "open", file, failure);
+    return false;
+  }
+
+  // `path` is SYSTEM/EVENT/id. False, and an error, when it may not be read.
+  bool addTracepoint(const TracepointBinding& tracepoints, const std::string& file, std::string_view path) {
     std::string content;
-    const std::optional<std::uint64_t> id = system_.read(file, &content) == 0 ? countIn(content) : std::nullopt;
-    if (!id) return;  // it has gone meanwhile
+    const int failure = system_.read(file, &content);
+    if (isNoAccess(failure)) return refuse(file, failure);
+    const std::optional<std::uint64_t> id = failure == 0 ? countIn(content) : std::nullopt;
+    if (!id) return true;  // it has gone meanwhile
     const std::string system(path.substr(0, path.find('/')));
     const std::string event(path.substr(system.size() + 1, path.rfind('/') - system.size() - 1));
     channels_.push_back({{tracepoints.group.value_or("tracepoints"), tracepoints.subgroup.value_or(system),
@@ -158,6 +168,7 @@ class Enumeration {
                          system + ":" + event,
                          {},
                          id});
+    return true;
   }
 
   CounterSystem& system_;

@@ -79,6 +79,14 @@ TEST(CounterChannels, AreTheLinesOfAFileThatAreCounters) {
               ElementsAre("kernel|vm|pgfault /proc/vmstat pgfault", "kernel|vm|pgmajfault /proc/vmstat pgmajfault"));
 }
 
+TEST(CounterChannels, AreOneForAllLinesOfOneKey) {
+  FakeCounters system;
+  system.files["/stat"] = "a 1\nb x\na 2\nb 3\n";
+  Binding binding;
+  binding.counterFiles = {files("/stat", "g", "s", std::nullopt, "{name}")};
+  EXPECT_THAT(channelsOf(binding, system), ElementsAre("g|s|a /stat a"));  // of the key b the first line is no count
+}
+
 TEST(CounterChannels, LeaveOutWhatIsKnownToGoDown) {
   FakeCounters system;
   system.files = {{"/sys/class/net/lo/mtu", "1"}, {"/sys/class/net/lo/carrier_changes", "1"}};
@@ -107,6 +115,32 @@ TEST(CounterChannels, AreTracepointsInEitherPlace) {
   EXPECT_THAT(channelsOf(binding, system), ElementsAre("g|s|n vb2:vb2_qbuf 8"));
 }
 
+TEST(CounterChannels, AreTracepointsOfTheFirstPlaceThatThereIs) {
+  // With tracefs mounted for this user, an event that is not there is no reason to look where only root may.
+  FakeCounters system;
+  system.files["/sys/kernel/tracing/events/vb2/vb2_qbuf/id"] = "8\n";
+  system.failures["/sys/kernel/debug/tracing/events"] = EACCES;
+  system.failures["/sys/kernel/debug/tracing/events/none"] = EACCES;
+  Binding binding;
+  binding.tracepoints = {{"none", "*", std::nullopt, std::nullopt, std::nullopt}};
+  EXPECT_THAT(channelsOf(binding, system), IsEmpty());
+}
+
+TEST(CounterChannels, AreRefusedWhereATracepointMayNotBeRead) {
+  const char* const file = "/sys/kernel/tracing/events/vb2/vb2_qbuf/id";
+  class Unreadable final : public CounterSystem {
+   public:
+    int list(const std::string&, std::vector<DirectoryEntry>*) override { return 0; }
+    int find(const std::string&) override { return 0; }
+    int read(const std::string&, std::string*) override { return EACCES; }
+    int openTracepoint(std::uint64_t, int, FileDescriptor*) override { return ENOENT; }
+  } system;
+  Binding binding;
+  binding.tracepoints = {{"vb2", "vb2_qbuf", std::nullopt, std::nullopt, std::nullopt}};
+  EXPECT_THAT(channelsOf(binding, system),
+              ElementsAre(std::string("open on ") + file + " failed: Permission denied (EACCES)"));
+}
+
 TEST(CounterChannels, AreRefusedWhereOneMayNotLook) {
   Binding directories;
   directories.counterFiles = {files("/a/{name}", "g", "s", std::nullopt)};
@@ -133,6 +167,7 @@ TEST(CounterChannels, AreRefusedWhereOneMayNotLook) {
   for (const auto& row : kRows) {
     FakeCounters system;
     system.files["/a/b"] = "x 1\n";
+    system.files["/sys/kernel/tracing/events/vb2/vb2_qbuf/id"] = "1\n";
     system.failures[row.path] = EACCES;
     EXPECT_THAT(channelsOf(row.binding, system), ElementsAre(row.problem)) << row.path;
     DiagnosticErrorPtr error;
@@ -170,13 +205,36 @@ TEST(CounterChannels, FollowLinksToFilesAndDirectories) {
   EXPECT_THAT(channelsOf(binding, system), ElementsAre("g|lo|link /net/lo/link"));
 }
 
+TEST(CounterChannels, PassOverLinksThatLeadNowhereButNotOverThoseThatMayNotBeFollowed) {
+  class Links final : public CounterSystem {
+   public:
+    int list(const std::string& directory, std::vector<DirectoryEntry>* entries) override {
+      if (directory != "/a") return ELOOP;
+      *entries = {{"link", EntryKind::kOther}};
+      return 0;
+    }
+    int find(const std::string&) override { return failure; }
+    int read(const std::string&, std::string*) override { return ENOENT; }
+    int openTracepoint(std::uint64_t, int, FileDescriptor*) override { return ENOENT; }
+    int failure = ELOOP;
+  } system;
+  Binding binding;
+  binding.counterFiles = {files("/a/{name}", "g", "s", std::nullopt), files("/a/{subgroup}/{name}", "g", {}, {}),
+                          files("/loop", "g", "s", "n")};
+  EXPECT_THAT(channelsOf(binding, system), IsEmpty());
+  system.failure = EACCES;
+  EXPECT_THAT(channelsOf(binding, system), ElementsAre("stat on /a/link failed: Permission denied (EACCES)"));
+}
+
 TEST(CountIn, IsAWholeNumberOf64BitsAndNothingElse) {
   EXPECT_EQ(countIn("0\n"), 0U);
   EXPECT_EQ(countIn(" \t42\n\n"), 42U);
   EXPECT_EQ(countIn("18446744073709551615"), std::numeric_limits<std::uint64_t>::max());
-  for (const char* text : {"", "\n", "-1", "+1", "1.5", "1 2", "0x10", "one", "18446744073709551616", "7 kB"}) {
+  for (const char* text :
+       {"", "\n", "-1", "+1", "1.5", "1 2", "0x10", "one", "18446744073709551616", "7 kB", "7\r\n"}) {
     EXPECT_EQ(countIn(text), std::nullopt) << text;
   }
+  EXPECT_EQ(countIn(std::string_view("7\0\n", 3)), std::nullopt);
 }
 
 TEST(ProcessorsIn, AreThoseOfAList) {

@@ -7,13 +7,13 @@
 #include <sys/syscall.h>
 
 #include <cerrno>
+#include <memory>
 #include <string_view>
-#include <utility>
 
 namespace quazor {
 namespace {
 
-constexpr std::size_t kLongestFile = 1024 * 1024;
+constexpr std::size_t kLongestFile = std::size_t{1024} * 1024;
 constexpr std::size_t kChunk = 4096;  // what most files of the kernel hold at the most
 
 EntryKind kindOf(unsigned char type) {
@@ -26,20 +26,19 @@ EntryKind kindOf(unsigned char type) {
 
 class RunningSystem final : public CounterSystem {
  public:
-  RunningSystem(std::filesystem::path root, PerfEventOpen perfEventOpen)
-      : root_(std::move(root)), perfEventOpen_(perfEventOpen) {}
+  RunningSystem(const std::filesystem::path& root, PerfEventOpen perfEventOpen)
+      : root_(root), perfEventOpen_(perfEventOpen) {}
 
   int list(const std::string& directory, std::vector<DirectoryEntry>* entries) override {
-    DIR* const open = ::opendir((root_ + directory).c_str());
+    const std::unique_ptr<DIR, int (*)(DIR*)> open(::opendir((root_ + directory).c_str()), ::closedir);
     if (open == nullptr) return errno;
-    errno = 0;
-    while (const dirent* const entry = ::readdir(open)) {
+    for (;;) {
+      errno = 0;  // readdir leaves it so at the end; what follows may set it
+      const dirent* const entry = ::readdir(open.get());
+      if (entry == nullptr) return errno;
       const std::string_view name = entry->d_name;
       if (name != "." && name != "..") entries->push_back({std::string(name), kindOf(entry->d_type)});
     }
-    const int failure = errno;
-    ::closedir(open);
-    return failure;
   }
 
   int find(const std::string& file) override {
@@ -94,8 +93,8 @@ int systemPerfEventOpen(perf_event_attr* attributes, int process, int processor,
   return static_cast<int>(::syscall(SYS_perf_event_open, attributes, process, processor, group, flags));
 }
 
-std::shared_ptr<CounterSystem> systemCounters(std::filesystem::path root, PerfEventOpen perfEventOpen) {
-  return std::make_shared<RunningSystem>(std::move(root), perfEventOpen);
+std::shared_ptr<CounterSystem> systemCounters(const std::filesystem::path& root, PerfEventOpen perfEventOpen) {
+  return std::make_shared<RunningSystem>(root, perfEventOpen);
 }
 
 }  // namespace quazor

@@ -48,7 +48,7 @@ using PerfEventOpen = int (*)(perf_event_attr* attributes, int process, int proc
 int systemPerfEventOpen(perf_event_attr* attributes, int process, int processor, int group, unsigned long flags);
 
 // The running system's. `root` stands before every path.
-std::shared_ptr<CounterSystem> systemCounters(std::filesystem::path root = {},
+std::shared_ptr<CounterSystem> systemCounters(const std::filesystem::path& root = {},
                                               PerfEventOpen perfEventOpen = systemPerfEventOpen);
 
 }  // namespace quazor

@@ -55,6 +55,15 @@ TEST_F(CounterSystemTest, FindsFilesOnly) {
   EXPECT_EQ(system_->find("/a/none"), ENOENT);
 }
 
+TEST_F(CounterSystemTest, TellsOfLinksThatLeadToThemselves) {
+  fs::create_symlink("loop", root_ / "a/loop");
+  std::vector<DirectoryEntry> entries;
+  std::string content;
+  EXPECT_EQ(system_->find("/a/loop"), ELOOP);
+  EXPECT_EQ(system_->list("/a/loop", &entries), ELOOP);
+  EXPECT_EQ(system_->read("/a/loop", &content), ELOOP);
+}
+
 TEST_F(CounterSystemTest, ReadsFilesOfAnyLength) {
   std::string content = "before";
   EXPECT_EQ(system_->read("/a/file", &content), 0);

@@ -11,6 +11,7 @@ namespace {
 constexpr std::string_view kStock = "it tells how much there is now";
 constexpr std::string_view kReading = "it is a reading of a sensor";
 constexpr std::string_view kSetting = "it is a setting";
+constexpr std::string_view kState = "it tells how something is now";
 
 struct Rule {
   std::string_view file;
@@ -25,11 +26,13 @@ constexpr Rule kRules[] = {
     {"/proc/vmstat", "workingset_nodes", kStock},
     {"/proc/meminfo", "*", kStock},
     {"/proc/loadavg", "*", kStock},
-    {"/sys/fs/cgroup/*/memory.stat", "pg*", {}},
-    {"/sys/fs/cgroup/*/memory.stat", "workingset_*", {}},
-    {"/sys/fs/cgroup/*/memory.stat", "thp_*", {}},
-    {"/sys/fs/cgroup/*/memory.stat", "*", kStock},
-    {"/sys/fs/cgroup/*/cgroup.stat", "*", kStock},
+    {"/sys/fs/cgroup*/memory.stat", "pg*", {}},  // of a group, or of the root itself
+    {"/sys/fs/cgroup*/memory.stat", "workingset_*", {}},
+    {"/sys/fs/cgroup*/memory.stat", "thp_*", {}},
+    {"/sys/fs/cgroup*/memory.stat", "zswp*", {}},
+    {"/sys/fs/cgroup*/memory.stat", "*", kStock},
+    {"/sys/fs/cgroup*/cgroup.stat", "*", kStock},
+    {"/sys/fs/cgroup*/cgroup.events", "*", kState},
     {"/sys/fs/cgroup/*.current", "*", kStock},
     {"/sys/fs/cgroup/*.max", "*", kSetting},
     {"/sys/fs/cgroup/*.min", "*", kSetting},
@@ -52,6 +55,8 @@ constexpr Rule kRules[] = {
     {"/sys/*/brightness", "*", kSetting},
     {"/sys/*/net/*/statistics/*", "*", {}},
     {"/sys/*/net/*/carrier_*", "*", {}},
+    {"/sys/*/net/*/queues/*/tx_timeout", "*", {}},
+    {"/sys/*/net/*/device/*", "*", {}},  // what its driver tells of the hardware
     {"/sys/*/net/*", "*", kSetting},
 };
 

@@ -29,6 +29,13 @@ TEST(GaugeReason, TellsGaugesFromCounters) {
       {"/sys/fs/cgroup/a/memory.stat", "pgfault", false},
       {"/sys/fs/cgroup/a/memory.stat", "workingset_refault_file", false},
       {"/sys/fs/cgroup/a/memory.stat", "thp_fault_alloc", false},
+      {"/sys/fs/cgroup/a/memory.stat", "zswpin", false},
+      {"/sys/fs/cgroup/a/memory.stat", "zswapped", true},
+      {"/sys/fs/cgroup/memory.stat", "anon", true},
+      {"/sys/fs/cgroup/memory.stat", "pgfault", false},
+      {"/sys/fs/cgroup/cgroup.stat", "nr_descendants", true},
+      {"/sys/fs/cgroup/a/cgroup.events", "populated", true},
+      {"/sys/fs/cgroup/a/memory.events", "oom_kill", false},
       {"/sys/fs/cgroup/class/net/power_supply/temp/cpu.stat", "usage_usec", false},
       {"/sys/class/hwmon/hwmon0/temp1_input", "", true},
       {"/sys/devices/platform/x/hwmon/hwmon0/energy1_input", "", false},
@@ -46,6 +53,9 @@ TEST(GaugeReason, TellsGaugesFromCounters) {
       {"/sys/class/net/lo/statistics/rx_packets", "", false},
       {"/sys/class/net/eth0/carrier_changes", "", false},
       {"/sys/class/net/eth0/mtu", "", true},
+      {"/sys/class/net/eth0/queues/tx-0/tx_timeout", "", false},
+      {"/sys/class/net/eth0/queues/tx-0/xps_cpus", "", true},
+      {"/sys/class/net/eth0/device/errors/ecc", "", false},
       {"/sys/devices/platform/x/errors/mipi", "", false},
   };
   for (const auto& row : kRows) EXPECT_EQ(!gaugeReason(row.file, row.key).empty(), row.isGauge) << row.file << row.key;

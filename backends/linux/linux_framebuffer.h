@@ -9,7 +9,8 @@
 
 namespace quazor {
 
-// The main display is the binding's connector or, where it names none, the first one that is connected, by name.
+// The main display is the binding's connector or, where it names none, the first one that is connected, by card and
+// name.
 //
 // Its registry entry has one property, "DSPLY Debug Info": {"DSPLY power info": {"DSPLY power info panel": on}}, read
 // anew each time. The display is on only when its connector is connected and enabled and its power mode (DPMS) is On;

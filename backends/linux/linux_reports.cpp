@@ -37,6 +37,7 @@ class TracepointCount {
   }
 
   std::optional<std::uint64_t> total() const {
+    if (counters_.empty()) return std::nullopt;  // no processor counts it
     std::uint64_t total = 0;
     for (const FileDescriptor& counter : counters_) {
       std::uint64_t count = 0;
@@ -57,18 +58,19 @@ class FileReader {
 
   // False, and an error, when the file may not be read.
   bool read(const CounterChannel& channel, std::optional<std::uint64_t>* count, DiagnosticErrorPtr* error) {
-    if (channel.key.empty() || channel.file != file_) {
-      file_ = channel.file;
+    const bool isKeyed = !channel.key.empty();
+    if (!isKeyed || channel.file != fileOfLines_) {
+      fileOfLines_ = isKeyed ? channel.file : std::string();
       lines_.clear();
-      failure_ = system_.read(file_, &content_);
-      if (failure_ == 0 && !channel.key.empty()) readLines();
+      failure_ = system_.read(channel.file, &content_);
+      if (failure_ == 0 && isKeyed) readLines();
     }
     if (isNoAccess(failure_)) {
-      failSystemCall(error, "open", file_, failure_);
+      failSystemCall(error, "open", channel.file, failure_);
       return false;
     }
     if (failure_ != 0) return true;
-    if (channel.key.empty()) {
+    if (!isKeyed) {
       *count = countIn(content_);
     } else if (const auto line = lines_.find(channel.key); line != lines_.end()) {
       *count = line->second;
@@ -83,7 +85,7 @@ class FileReader {
   }
 
   CounterSystem& system_;
-  std::string file_;
+  std::string fileOfLines_;  // empty: what was read last has no lines
   std::string content_;
   int failure_ = 0;
   std::unordered_map<std::string_view, std::optional<std::uint64_t>> lines_;  // of the content
@@ -119,28 +121,33 @@ class Channels {
   }
 
  private:
+  // All of them, or none: one that fails lets go of what was opened with it.
   bool openTracepoints(const Chosen& chosen, DiagnosticErrorPtr* error) {
     std::optional<std::vector<int>> processors;
+    std::unordered_map<std::uint64_t, TracepointCount> opened;
     for (const std::size_t index : chosen) {
       const CounterChannel& channel = all_[index];
-      if (!channel.tracepoint || tracepoints_.contains(*channel.tracepoint)) continue;
+      if (!channel.tracepoint) continue;
+      if (tracepoints_.contains(*channel.tracepoint) || opened.contains(*channel.tracepoint)) continue;
       if (!processors) processors = onlineProcessors();
       TracepointCount counter;
       int failure = 0;
       if (counter.open(*channel.tracepoint, *processors, *system_, &failure)) {
-        tracepoints_.emplace(*channel.tracepoint, std::move(counter));
+        opened.emplace(*channel.tracepoint, std::move(counter));
       } else if (failure != ENOENT) {  // which is of a tracepoint that has gone
         failSystemCall(error, "perf_event_open", "the tracepoint " + channel.file, failure);
         return false;
       }
     }
+    tracepoints_.merge(opened);
     return true;
   }
 
   std::vector<int> onlineProcessors() {
     std::string list;
-    if (system_->read("/sys/devices/system/cpu/online", &list) != 0) return {0};
-    return processorsIn(list);
+    std::vector<int> processors;
+    if (system_->read("/sys/devices/system/cpu/online", &list) == 0) processors = processorsIn(list);
+    return processors.empty() ? std::vector<int>{0} : processors;
   }
 
   const std::vector<CounterChannel> all_;

@@ -42,6 +42,8 @@ Json entryOf(const CounterFilesBinding& files) {
   return entry;
 }
 
+std::string orUnknown(const std::string& word) { return word.empty() ? "not told" : word; }
+
 class Probe {
  public:
   explicit Probe(const ProbeSources& sources) : sources_(sources) {}
@@ -80,7 +82,7 @@ class Probe {
   void probeHid() {
     const std::vector<HidrawNode> nodes = hidrawNodes(sources_.hid);
     if (!hasHidraw(sources_.hid)) {
-      tell("  none: this kernel has no hidraw (CONFIG_HIDRAW)");
+      tell("  none: this kernel has no hidraw (CONFIG_HIDRAW), or its module hid is not loaded");
     } else if (nodes.empty()) {
       tell("  none: no HID device is connected, or its driver is not loaded");
     }
@@ -113,8 +115,9 @@ class Probe {
     for (const DisplayConnector& one : connectors) {
       const bool isMain = one.isConnected() && !binding_.contains("display");
       if (isMain) binding_["display"] = {{"connector", one.name}};
-      tell("  " + one.name + " of " + one.card + ": " + one.status + ", " + one.enabled + ", power mode " + one.dpms +
-           (one.isPowered() ? ": it is on" : ": it is off") + (isMain ? "; the main display below" : ""));
+      tell("  " + one.name + " of " + one.card + ": " + orUnknown(one.status) + ", " + orUnknown(one.enabled) +
+           ", power mode " + orUnknown(one.dpms) + (one.isPowered() ? ": it is on" : ": it is off") +
+           (isMain ? "; the main display below" : ""));
     }
   }
 
@@ -143,7 +146,7 @@ class Probe {
       DiagnosticErrorPtr error;
       failSystemCall(&error, "perf_event_open", channels.front().file, failure);
       tell("    They may not be counted: " + error->localizedDescription());
-      tell("    The capability CAP_PERFMON, or a sysctl kernel.perf_event_paranoid of -1, allows it.");
+      tell("    The capability CAP_PERFMON, or a sysctl kernel.perf_event_paranoid of 0 or -1, allows it.");
       return;
     }
     const auto isOfCameras = [](const CounterChannel& one) { return one.file == "v4l2:v4l2_dqbuf"; };

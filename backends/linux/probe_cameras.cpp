@@ -22,7 +22,8 @@ constexpr double kUsualRate = 30;
 // What is chosen of a camera that offers any size, and the most that is chosen of others.
 constexpr std::uint32_t kUsualWidth = 640;
 constexpr std::uint32_t kUsualHeight = 480;
-constexpr std::uint64_t kMostPixels = 1920U * 1080U;
+constexpr std::uint64_t kMostPixels = std::uint64_t{1920} * 1080;
+constexpr std::uint32_t kLargestSide = 65536;  // that a binding can name
 
 bool reachesUsualRate(const FrameSize& size) {
   bool below = false;
@@ -92,6 +93,7 @@ std::optional<std::pair<std::uint32_t, std::uint32_t>> chosenSize(const VideoNod
   for (const FrameSize& size : details.formats.front().sizes) {
     const std::uint32_t width = std::clamp(kUsualWidth, size.width, std::max(size.width, size.highestWidth));
     const std::uint32_t height = std::clamp(kUsualHeight, size.height, std::max(size.height, size.highestHeight));
+    if (std::min(width, height) == 0 || std::max(width, height) > kLargestSide) continue;
     const std::uint64_t pixels = std::uint64_t{width} * height;
     const std::pair<bool, std::uint64_t> worth{reachesUsualRate(size), pixels <= kMostPixels ? pixels : 1};
     if (chosen && worth <= best) continue;
@@ -148,7 +150,9 @@ class CameraProbe {
     };
     const auto size = chosenSize(*details);
     if (!size) {
-      tell("    does not fit: its driver tells no format, or no size of the first one");
+      tell("    does not fit: its driver tells no format, or no size of the first one that a camera can have");
+    } else if (node.driver.empty() && node.card.empty() && node.busInfo.empty()) {
+      tell("    does not fit: its driver tells nothing of it by which a binding could name it");
     } else if (std::ranges::count_if(nodes_, isLikeIt) > 1) {
       tell("    does not fit: another camera has the same driver, card and bus, so a binding cannot tell them apart");
     } else if (cameras_.size() == kPorts.size()) {

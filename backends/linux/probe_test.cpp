@@ -71,8 +71,8 @@ class ProbeTest : public ::testing::Test {
 TEST_F(ProbeTest, TellsOfAMachineWithNothing) {
   EXPECT_THAT(lines(),
               ElementsAre("Cameras", HasSubstr("none: no driver offers a video node"), "HID devices",
-                          "  none: this kernel has no hidraw (CONFIG_HIDRAW)", "Displays",
-                          HasSubstr("none: no graphics driver"), "Counters",
+                          "  none: this kernel has no hidraw (CONFIG_HIDRAW), or its module hid is not loaded",
+                          "Displays", HasSubstr("none: no graphics driver"), "Counters",
                           "  /sys/fs/cgroup/{group}/{subgroup}/{name}/cpu.stat, key usage_usec: 0",
                           "  /sys/class/net/{subgroup}/statistics/{name}: 0",
                           "  /sys/bus/iio/devices/{subgroup}/in_{name}_raw: 0", "  /proc/vmstat, key {name}: 0",
@@ -173,6 +173,20 @@ TEST_F(ProbeTest, TellsWhyACameraDoesNotFit) {
   EXPECT_TRUE(binding_.cameras.empty());
 }
 
+TEST_F(ProbeTest, BindsNoCameraThatABindingCannotName) {
+  FakeNode nameless = fakeCamera("");
+  nameless.driver.clear();
+  nameless.card.clear();
+  kernel_->add(0, nameless);
+  FakeNode absurd = fakeCamera("fake:1");
+  absurd.formats = {{absurd.formats[0].code, "format", {{0, 0, {{1, 30}}}, {70000, 1, {{1, 30}}}}}};
+  kernel_->add(1, absurd);
+  const std::vector<std::string> told = lines();
+  EXPECT_THAT(told, Contains(HasSubstr("tells nothing of it by which a binding could name it")));
+  EXPECT_THAT(told, Contains(HasSubstr("no size of the first one that a camera can have")));
+  EXPECT_TRUE(binding_.cameras.empty());
+}
+
 TEST_F(ProbeTest, TellsWhichCameraMetadataAreOf) {
   kernel_->add(0, fakeCamera("fake:0"));
   kernel_->add(10, fakeMetadata("fake:0"));
@@ -206,10 +220,12 @@ TEST_F(ProbeTest, TakesTheFirstConnectedDisplay) {
   connector("card0-HDMI-A-1", "disconnected", "On");
   connector("card0-HDMI-A-2", "connected", "Off");
   connector("card1-DSI-1", "connected", "On");
+  fs::create_directories(folder_ / "class/drm/card1-DP-1");
   EXPECT_THAT(lines(),
               testing::IsSupersetOf(
                   {"  HDMI-A-1 of card0: disconnected, enabled, power mode On: it is off",
                    "  HDMI-A-2 of card0: connected, enabled, power mode Off: it is off; the main display below",
+                   "  DP-1 of card1: not told, not told, power mode not told: it is off",
                    "  DSI-1 of card1: connected, enabled, power mode On: it is on"}));
   ASSERT_TRUE(binding_.display);
   EXPECT_EQ(binding_.display->connector, "HDMI-A-2");
@@ -245,7 +261,7 @@ TEST_F(ProbeTest, BindsNoTracepointThatIsNotThereOrMayNotBeCounted) {
               testing::IsSupersetOf(
                   {"    They may not be counted: perf_event_open on v4l2:v4l2_dqbuf failed: Permission denied "
                    "(EACCES)",
-                   "    The capability CAP_PERFMON, or a sysctl kernel.perf_event_paranoid of -1, allows it."}));
+                   "    The capability CAP_PERFMON, or a sysctl kernel.perf_event_paranoid of 0 or -1, allows it."}));
   EXPECT_TRUE(binding_.tracepoints.empty());
   counters_->failures = {{"/sys/kernel/tracing/events", EACCES}};
   EXPECT_THAT(lines(), Contains("  tracepoints: opendir on /sys/kernel/tracing/events failed: Permission denied "
