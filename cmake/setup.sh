@@ -39,7 +39,7 @@ build() {
   local log
   log=$(mktemp)
   if [ ! -f "$directory/build.ninja" ]; then
-    say "Building in ${directory#"$root"/} (once; this takes a minute or two)"
+    say "Building in ${directory#"$root"/} (once; this takes some minutes)"
     mkdir -p "$directory"
     if ! cmake -S "$root" -B "$directory" -G Ninja "$@" >"$log" 2>&1; then
       cat "$log" >&2
