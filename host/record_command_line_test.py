@@ -328,6 +328,15 @@ class OnlyFailedTest(RecordTest):
         result = quazor("run", "--only", "failed", "--set", "minimum=0", env=self.state)
         self.assertEqual(result.returncode, 0, result.stderr)
 
+    def test_a_seed_is_not_ignored_where_the_phone_of_that_run_was_a_machine(self):
+        binding = self.write("machine.json", '{"title": "Nothing"}')
+        result = quazor("run", "Broken.Nothing", "--plugin", WORKING, "--phone", f"linux:{binding}", env=self.state)
+        self.assertEqual(result.returncode, 2, result.stderr)
+        for option in (["--seed", "3"], ["--realtime"]):
+            result = quazor("run", "--only", "failed", *option, env=self.state)
+            self.assert_refused(result, 64, "for simulated phones; that run's was 'linux:")
+        self.assertEqual(quazor("run", "--only", "failed", env=self.state).returncode, 2)
+
     def test_what_was_not_begun_runs_with_the_installed_profile(self):
         self.run_fake(names=["Fake.One", "Fake.Two"], env=self.state)
         last = pathlib.Path(self.state["XDG_STATE_HOME"]) / "quazor/last_run.jsonl"

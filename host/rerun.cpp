@@ -1,6 +1,8 @@
 #include "host/rerun.h"
 
 #include "host/last_run.h"
+#include "host/phone.h"
+#include "host/record_file.h"
 
 #include <algorithm>
 #include <utility>
@@ -27,8 +29,7 @@ void refuseFailedPlugins(const RecordedRun& run) {
   }
 }
 
-}  // namespace
-
+// The parameters of a run's diagnostics of these names; what was not begun is not among them.
 Profile recordedProfile(const std::filesystem::path& record, const RecordedRun& run,
                         const std::vector<std::string>& names) {
   Profile profile{record, {}};
@@ -41,6 +42,8 @@ Profile recordedProfile(const std::filesystem::path& record, const RecordedRun& 
   return profile;
 }
 
+}  // namespace
+
 Options optionsToRunAgain(Options options) {
   const std::filesystem::path record = options.failedOf.empty() ? lastRunFile() : options.failedOf;
   if (record.empty() || (options.failedOf.empty() && !std::filesystem::exists(record))) {
@@ -51,7 +54,13 @@ Options optionsToRunAgain(Options options) {
   options.names = namesNotPassed(run);
   options.recorded = recordedProfile(record, run, options.names);
   if (options.plugins.empty()) options.plugins.assign(run.began.plugins.begin(), run.began.plugins.end());
-  if (options.phone.empty()) options.phone = run.began.phone;
+  if (options.phone.empty()) {
+    options.phone = run.began.phone;
+    if (bindingNamed(options.phone) && (options.realTime || options.seed != 0)) {
+      throw Refusal(ExitCode::kUsage, "--seed and --realtime are for simulated phones; that run's was '" +
+                                          run.began.phone + "'; --phone chooses another");
+    }
+  }
   // What the installed profile set then is in the record; it may have changed since, or have been left out.
   const bool allRecorded = options.recorded->entries.size() == options.names.size();
   if (options.profile.empty() && allRecorded) options.withoutProfile = true;
