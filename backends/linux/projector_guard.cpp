@@ -7,7 +7,6 @@
 #include <poll.h>
 #include <sys/ioctl.h>
 #include <sys/prctl.h>
-#include <sys/resource.h>
 #include <sys/socket.h>
 #include <sys/syscall.h>
 #include <sys/wait.h>
@@ -37,13 +36,11 @@ void closeAllBut(const GuardDescriptors& kept) {
   ::syscall(SYS_close_range, first, ~0U, 0U);
 }
 
-// In the new process; it is ready when it says so. The priority helps it to come before whoever looks for processes
-// that were left behind; without the right to it, it is as good as any other.
+// In the new process; it is ready when it says so.
 [[noreturn]] void becomeGuard(const GuardDescriptors& descriptors, const std::vector<ControlValue>& values,
                               ControlSetter set) {
   ::setsid();
   ::prctl(PR_SET_NAME, kProjectorGuardName);
-  ::setpriority(PRIO_PROCESS, 0, -20);
   closeAllBut(descriptors);
   const char ready = 0;
   ::send(descriptors.connection, &ready, 1, MSG_NOSIGNAL);
