@@ -5,7 +5,7 @@
 // Each sample is taken in a process of its own, forked from this one, which never loads either: what dlopen does once
 // (mapping, relocation, initialisers, registration) is done anew each time. libquazor is there already, as it is in
 // a host. The child measures and tells the time through a pipe.
-#include "frame/log_channel.h"
+#include "contract/log_channel.h"
 
 #include <benchmark/benchmark.h>
 

@@ -1,6 +1,6 @@
 // A disabled log line beside a call of an empty function with the same arguments.
-#include "frame/diagnostic_error.h"
-#include "frame/log_channel.h"
+#include "contract/diagnostic_error.h"
+#include "contract/log_channel.h"
 
 #include <benchmark/benchmark.h>
 

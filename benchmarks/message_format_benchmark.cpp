@@ -1,6 +1,6 @@
 // formatMessage beside libfmt, on lines that the diagnostics log.
-#include "frame/diagnostic_error.h"
-#include "frame/message_format.h"
+#include "contract/diagnostic_error.h"
+#include "contract/message_format.h"
 
 #include <benchmark/benchmark.h>
 #include <fmt/compile.h>

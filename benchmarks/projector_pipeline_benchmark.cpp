@@ -3,8 +3,8 @@
 #include "backends/threads/real_clock.h"
 #include "backends/threads/thread_concurrency.h"
 #include "benchmarks/projector_pipeline_peer.h"
-#include "projector_fault/tessel_fault_experiment.h"
-#include "tests/hand_made_camera.h"
+#include "diagnostics/projector_fault/tessel_fault_experiment.h"
+#include "tests/support/hand_made_camera.h"
 
 #include <benchmark/benchmark.h>
 #include <unistd.h>

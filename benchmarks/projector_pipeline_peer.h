@@ -1,11 +1,11 @@
 // The projector fault experiment's pipeline as one writes it on standalone Asio: for comparison.
 #pragma once
 
-#include "frame/log_channel.h"
+#include "contract/log_channel.h"
+#include "diagnostics/projector_fault/tessel_frame_description.h"
 #include "platform/capture_keys.h"
 #include "platform/clock.h"
 #include "platform/pixel_buffer.h"
-#include "projector_fault/tessel_frame_description.h"
 
 #include <asio.hpp>
 

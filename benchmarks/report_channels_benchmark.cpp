@@ -1,9 +1,9 @@
 // What a report channel costs a projector fault run: filter, two snapshots, their delta and the result, for phones with
 // few channels and with very many.
+#include "diagnostics/projector_fault/fixed_clock_for_tests.h"
+#include "diagnostics/projector_fault/tessel_fault_experiment.h"
 #include "platform/concurrency.h"
-#include "projector_fault/fixed_clock_for_tests.h"
-#include "projector_fault/tessel_fault_experiment.h"
-#include "tests/hand_made_camera.h"
+#include "tests/support/hand_made_camera.h"
 
 #include <benchmark/benchmark.h>
 #include <malloc.h>

@@ -1,7 +1,7 @@
 // The run loops that run_loop_benchmark compares: ours, those that also wait for descriptors, and GLib's main loop.
 #pragma once
 
-#include "backends/linux/descriptor_run_loop.h"
+#include "backends/linux/system/descriptor_run_loop.h"
 #include "backends/threads/thread_run_loop.h"
 
 #include <glib.h>

@@ -1,7 +1,7 @@
 // What an image of the display sensor costs: reading its record, beside a plain copy of the samples that are kept, and
 // the way of a report from the device's callback through stream and experiment.
-#include "sensor_images/nimbe_image_experiment.h"
-#include "tests/hand_made_sensor.h"
+#include "diagnostics/sensor_images/nimbe_image_experiment.h"
+#include "tests/support/hand_made_sensor.h"
 
 #include <benchmark/benchmark.h>
 

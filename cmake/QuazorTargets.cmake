@@ -11,6 +11,7 @@ function(quazor_configure target)
   endif()
   set_target_properties(${target} PROPERTIES CXX_EXTENSIONS OFF CXX_VISIBILITY_PRESET hidden
                         VISIBILITY_INLINES_HIDDEN ON POSITION_INDEPENDENT_CODE ON)
+  set_target_properties(${target} PROPERTIES UNITY_BUILD ${QUAZOR_UNITY} UNITY_BUILD_BATCH_SIZE 8)
   if(QUAZOR_SANITIZE)
     target_compile_options(${target} PRIVATE -fsanitize=${QUAZOR_SANITIZE} -fno-sanitize-recover=all
                            -fno-omit-frame-pointer)

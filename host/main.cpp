@@ -1,7 +1,7 @@
 // quazor: runs hardware diagnostics from the command line.
-#include "host/commands.h"
-#include "host/exit_code.h"
-#include "host/installation.h"
+#include "host/cli/installation.h"
+#include "host/command/commands.h"
+#include "host/error/exit_code.h"
 
 #include <langinfo.h>
 #include <locale.h>

@@ -2,7 +2,7 @@
 // services must spell alike.
 #pragma once
 
-#include "frame/contract.h"
+#include "contract/contract.h"
 
 #include <string_view>
 

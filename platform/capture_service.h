@@ -12,9 +12,9 @@
 //   thrown.
 #pragma once
 
-#include "frame/contract.h"
-#include "frame/diagnostic_error.h"
-#include "frame/value.h"
+#include "contract/contract.h"
+#include "contract/diagnostic_error.h"
+#include "contract/value.h"
 #include "platform/capture_keys.h"
 
 #include <memory>

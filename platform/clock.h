@@ -1,8 +1,8 @@
 // Clock: time as experiments see it.
 #pragma once
 
-#include "frame/contract.h"
-#include "frame/value.h"
+#include "contract/contract.h"
+#include "contract/value.h"
 
 #include <chrono>
 

@@ -1,7 +1,7 @@
 // Serial queues and semaphores.
 #pragma once
 
-#include "frame/contract.h"
+#include "contract/contract.h"
 #include "platform/task.h"
 
 #include <chrono>

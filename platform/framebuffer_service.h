@@ -5,8 +5,8 @@
 // Errors: null or nothing; nothing is thrown.
 #pragma once
 
-#include "frame/contract.h"
-#include "frame/value.h"
+#include "contract/contract.h"
+#include "contract/value.h"
 
 #include <memory>
 #include <optional>

@@ -8,9 +8,9 @@
 //   it may have none to give, and stores nothing. Nothing is thrown.
 #pragma once
 
-#include "frame/contract.h"
-#include "frame/diagnostic_error.h"
-#include "frame/value.h"
+#include "contract/contract.h"
+#include "contract/diagnostic_error.h"
+#include "contract/value.h"
 #include "platform/run_loop.h"
 
 #include <cstdint>

@@ -1,7 +1,7 @@
 // MediaTime: when a frame or an event of a stream happened.
 #pragma once
 
-#include "frame/contract.h"
+#include "contract/contract.h"
 
 #include <cstdint>
 

@@ -1,8 +1,8 @@
 // PixelBuffer: the image buffer of one captured frame; and the handlers that receive frames and events.
 #pragma once
 
-#include "frame/contract.h"
-#include "frame/value.h"
+#include "contract/contract.h"
+#include "contract/value.h"
 #include "platform/media_time.h"
 
 #include <cstdint>

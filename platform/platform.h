@@ -1,8 +1,8 @@
 // Platform: the services that stand behind a plug-in, in one bundle.
 #pragma once
 
-#include "frame/contract.h"
-#include "frame/log_channel.h"
+#include "contract/contract.h"
+#include "contract/log_channel.h"
 #include "platform/capture_service.h"
 #include "platform/clock.h"
 #include "platform/concurrency.h"

@@ -8,9 +8,9 @@
 // Cost: filtering, sampling and subtracting are linear in the channels of the set; sets of a million channels occur.
 #pragma once
 
-#include "frame/contract.h"
-#include "frame/diagnostic_error.h"
-#include "frame/value.h"
+#include "contract/contract.h"
+#include "contract/diagnostic_error.h"
+#include "contract/value.h"
 
 #include <functional>
 #include <memory>

@@ -4,7 +4,7 @@
 // are told what the loop is doing. Both are added for a mode and take part only in runs in that mode.
 #pragma once
 
-#include "frame/contract.h"
+#include "contract/contract.h"
 
 #include <chrono>
 #include <cstdint>

@@ -1,7 +1,7 @@
 // Task: work that is handed to a queue.
 #pragma once
 
-#include "frame/contract.h"
+#include "contract/contract.h"
 
 #include <concepts>
 #include <cstddef>

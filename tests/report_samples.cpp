@@ -4,9 +4,9 @@
 //
 // The directory gets a file for each format, with its name. In it each run is a line with the number of its bytes, and
 // then the report.
-#include "host/host_error.h"
-#include "host/report_format.h"
-#include "host/verdict_of_record.h"
+#include "host/error/host_error.h"
+#include "host/model/verdict_of_record.h"
+#include "host/report/report_format.h"
 
 #include <algorithm>
 #include <cstdint>

@@ -1,6 +1,6 @@
 // The example plug-in, on a clock that wakes its sleepers as the test says.
-#include "frame/lab.h"
-#include "frame/message_format.h"
+#include "contract/lab.h"
+#include "contract/message_format.h"
 #include "platform/platform.h"
 
 #include <dlfcn.h>

@@ -1,9 +1,9 @@
 #include "backends/linux/linux_phone.h"
 
-#include "backends/linux/descriptor_run_loop.h"
-#include "backends/linux/linux_framebuffer.h"
-#include "backends/linux/linux_hid.h"
-#include "backends/linux/linux_reports.h"
+#include "backends/linux/counters/linux_reports.h"
+#include "backends/linux/display/linux_framebuffer.h"
+#include "backends/linux/hid/linux_hid.h"
+#include "backends/linux/system/descriptor_run_loop.h"
 #include "backends/threads/real_clock.h"
 #include "backends/threads/thread_concurrency.h"
 

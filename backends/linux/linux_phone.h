@@ -1,8 +1,8 @@
 // The Linux machine as a phone: all its services in one bundle.
 #pragma once
 
-#include "backends/linux/binding.h"
-#include "backends/linux/linux_capture.h"
+#include "backends/linux/binding/binding.h"
+#include "backends/linux/capture/linux_capture.h"
 #include "platform/platform.h"
 
 #include <memory>

@@ -1,7 +1,7 @@
 // A small scenario, and a user of its capture device, for the tests of this folder.
 #pragma once
 
-#include "backends/simulated/capture_error.h"
+#include "backends/simulated/calls/capture_error.h"
 #include "backends/simulated/simulated_phone.h"
 #include "platform/capture_service.h"
 
@@ -74,5 +74,13 @@ struct PhoneUser {
   SynchronizedStreamsGroups groups;
   CaptureStreams streams;
 };
+
+// A configuration that any slave of a group takes.
+inline Dictionary slaveConfiguration() {
+  return {{"StreamingOutputsEnabled", true},
+          {"FrameSkippingEnabled", false},
+          {"TimeMachineEnabled", false},
+          {"MasterToSlaveFrameRateRatio", 1}};
+}
 
 }  // namespace quazor

@@ -1,11 +1,11 @@
 // SimulatedPhone: a whole phone behind the platform's services, as a scenario describes it.
 #pragma once
 
-#include "backends/simulated/call_interceptor.h"
-#include "backends/simulated/capture_hardware.h"
-#include "backends/simulated/fault.h"
-#include "backends/simulated/scenario.h"
-#include "backends/simulated/virtual_scheduler.h"
+#include "backends/simulated/calls/call_interceptor.h"
+#include "backends/simulated/capture/capture_hardware.h"
+#include "backends/simulated/scenario/fault.h"
+#include "backends/simulated/scenario/scenario.h"
+#include "backends/simulated/time/virtual_scheduler.h"
 #include "platform/platform.h"
 
 #include <cstdint>

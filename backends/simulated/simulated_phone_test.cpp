@@ -1,7 +1,7 @@
 #include "backends/simulated/simulated_phone.h"
 
 #include "backends/simulated/phone_for_tests.h"
-#include "backends/simulated/simulation_stall.h"
+#include "backends/simulated/time/simulation_stall.h"
 #include "backends/threads/thread_concurrency.h"
 
 #include <gmock/gmock.h>

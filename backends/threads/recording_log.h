@@ -1,7 +1,7 @@
 // RecordingLog: keeps log lines in memory.
 #pragma once
 
-#include "frame/log_channel.h"
+#include "contract/log_channel.h"
 
 #include <mutex>
 #include <ostream>

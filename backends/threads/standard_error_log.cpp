@@ -1,6 +1,6 @@
 #include "backends/threads/standard_error_log.h"
 
-#include "frame/message_format.h"
+#include "contract/message_format.h"
 
 #include <unistd.h>
 

@@ -1,7 +1,7 @@
 // StandardErrorLog: log lines for people, on the standard error stream.
 #pragma once
 
-#include "frame/log_channel.h"
+#include "contract/log_channel.h"
 #include "platform/clock.h"
 
 #include <memory>

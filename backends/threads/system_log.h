@@ -1,7 +1,7 @@
 // SystemLog: log lines for the system's own log.
 #pragma once
 
-#include "frame/log_channel.h"
+#include "contract/log_channel.h"
 
 #include <cstddef>
 #include <functional>

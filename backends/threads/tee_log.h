@@ -1,7 +1,7 @@
 // TeeLog: one log line for several back-ends.
 #pragma once
 
-#include "frame/log_channel.h"
+#include "contract/log_channel.h"
 
 #include <memory>
 #include <string_view>

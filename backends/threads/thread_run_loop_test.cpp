@@ -19,7 +19,7 @@ namespace {
 
 using namespace std::chrono_literals;
 
-class ThreadsUnderTest {
+class ThreadRunLoopUnderTest {
  public:
   RunLoop& loop() { return *loops_.currentRunLoop(); }
   std::shared_ptr<Concurrency> concurrency() { return std::make_shared<ThreadConcurrency>(); }
@@ -29,8 +29,8 @@ class ThreadsUnderTest {
   ThreadRunLoops loops_;
 };
 
-INSTANTIATE_TYPED_TEST_SUITE_P(Threads, RunLoopConformance, ThreadsUnderTest);
-INSTANTIATE_TYPED_TEST_SUITE_P(Threads, RunLoopObserverConformance, ThreadsUnderTest);
+INSTANTIATE_TYPED_TEST_SUITE_P(Threads, RunLoopConformance, ThreadRunLoopUnderTest);
+INSTANTIATE_TYPED_TEST_SUITE_P(Threads, RunLoopObserverConformance, ThreadRunLoopUnderTest);
 
 RunLoop& currentLoop() { return *ThreadRunLoops().currentRunLoop(); }
 

@@ -1,6 +1,6 @@
 // A plug-in of one's own: how late does the platform's clock wake a thread that sleeps?
-#include "frame/diagnostic_contract.h"
-#include "frame/lab.h"
+#include "contract/diagnostic_contract.h"
+#include "contract/lab.h"
 #include "platform/platform.h"
 
 #include <chrono>

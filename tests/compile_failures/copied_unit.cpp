@@ -1,5 +1,5 @@
 // refused with: deleted
-#include "frame/unit.h"
+#include "contract/unit.h"
 
 #ifdef CORRECTED
 const quazor::QZUnit& unit = quazor::QZDimensionlessUnit::frames();

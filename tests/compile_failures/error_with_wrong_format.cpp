@@ -1,5 +1,5 @@
 // refused with: theFormatHasMorePlaceholdersThanArguments
-#include "frame/diagnostic_error.h"
+#include "contract/diagnostic_error.h"
 
 void refuse(quazor::DiagnosticErrorPtr* error) {
 #ifdef CORRECTED

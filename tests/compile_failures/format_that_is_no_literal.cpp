@@ -1,5 +1,5 @@
 // refused with: constant expression
-#include "frame/message_format.h"
+#include "contract/message_format.h"
 
 std::string message(const char* text) {
 #ifdef CORRECTED

@@ -1,5 +1,5 @@
 // refused with: theFormatHasMorePlaceholdersThanArguments
-#include "frame/message_format.h"
+#include "contract/message_format.h"
 
 #ifdef CORRECTED
 const std::string message = quazor::formatMessage("lamp %d of %d", 1, 2);

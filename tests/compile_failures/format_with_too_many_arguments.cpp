@@ -1,5 +1,5 @@
 // refused with: theFormatHasFewerPlaceholdersThanArguments
-#include "frame/message_format.h"
+#include "contract/message_format.h"
 
 #ifdef CORRECTED
 const std::string message = quazor::formatMessage("lamp %d", 1);

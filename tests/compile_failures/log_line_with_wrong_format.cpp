@@ -1,5 +1,5 @@
 // refused with: anArgumentDoesNotFitItsPlaceholder
-#include "frame/log_channel.h"
+#include "contract/log_channel.h"
 
 void report(std::int64_t count) {
 #ifdef CORRECTED

@@ -1,5 +1,5 @@
 // refused with: char.*Value|Value.*char
-#include "frame/value.h"
+#include "contract/value.h"
 
 #ifdef CORRECTED
 const quazor::Value value = "a";

@@ -1,5 +1,5 @@
 // refused with: deleted
-#include "frame/value.h"
+#include "contract/value.h"
 
 #ifdef CORRECTED
 const std::optional<quazor::Value> value;

@@ -1,5 +1,5 @@
 // refused with: int ?\*.*Value|Value.*int ?\*
-#include "frame/value.h"
+#include "contract/value.h"
 
 int number = 1;
 #ifdef CORRECTED

@@ -1,5 +1,5 @@
 // Any bytes as a report descriptor: what it says within its bounds, or a reason.
-#include "backends/linux/hid_report_descriptor.h"
+#include "backends/linux/hid/hid_report_descriptor.h"
 
 #include <cstddef>
 #include <cstdint>

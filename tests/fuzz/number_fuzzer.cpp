@@ -1,5 +1,5 @@
 // Any text as a number of the command line: a number that is finite, or a reason.
-#include "host/parameter_number.h"
+#include "host/text/parameter_number.h"
 
 #include <cmath>
 #include <cstddef>

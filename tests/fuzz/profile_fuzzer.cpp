@@ -1,6 +1,6 @@
 // Any text as a profile: a profile, or a refusal with a sentence.
-#include "host/exit_code.h"
-#include "host/profile.h"
+#include "host/error/exit_code.h"
+#include "host/plugin/profile.h"
 
 #include <cstddef>
 #include <cstdint>

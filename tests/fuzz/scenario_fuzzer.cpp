@@ -1,5 +1,5 @@
 // Any bytes as a scenario file: a scenario of which a phone can be made, or a sentence.
-#include "backends/simulated/scenario.h"
+#include "backends/simulated/scenario/scenario.h"
 #include "backends/simulated/simulated_phone.h"
 
 #include <sys/mman.h>

@@ -1,7 +1,7 @@
 // Any input reports in any order, with errors, closes and removals between them: only whole images reach the receiver,
 // with the values that are in their bytes, and an error is the last thing that does.
-#include "sensor_images/nimbe_image_experiment.h"
-#include "tests/hand_made_sensor.h"
+#include "diagnostics/sensor_images/nimbe_image_experiment.h"
+#include "tests/support/hand_made_sensor.h"
 
 #include <algorithm>
 #include <bit>

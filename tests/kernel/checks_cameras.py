@@ -4,7 +4,7 @@ from arrived import expect, expect_equal, underlying
 from kernel_trace import gaps_in, read_trace
 
 RATE = 30
-PORTS = {  # of bindings/vivid.json: the name in measurements and the device's bus info
+PORTS = {  # of data/bindings/vivid.json: the name in measurements and the device's bus info
     "BackWide": "platform:vivid-000",
     "BackTele": "platform:vivid-001",
     "BackSuperWide": "platform:vivid-002",

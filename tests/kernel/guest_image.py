@@ -72,7 +72,7 @@ def project_archive(directory):
     for program in sorted((directory / GUEST_PROGRAMS).iterdir()):
         if program.is_file() and os.access(program, os.X_OK):
             add_program(archive, f"/usr/bin/{program.name}", program)
-    archive.add("/rig/channels", channels_of(HERE.parent.parent / "scenarios/healthy.json").encode(), 0o644)
+    archive.add("/rig/channels", channels_of(HERE.parent.parent / "data/scenarios/healthy.json").encode(), 0o644)
     archive.add("/etc/passwd", b"root::0:0::/:/bin/sh\nnobody::65534:65534::/:/bin/sh\n", 0o644)
     archive.add_file("/init", HERE / "guest/init")
     for file in ("library", "step"):

@@ -1,6 +1,6 @@
 #include "tests/kernel/uhid_device.h"
 
-#include "backends/simulated/hid_image_report.h"
+#include "backends/simulated/hid/hid_image_report.h"
 
 #include <linux/input.h>
 #include <linux/uhid.h>

@@ -1,9 +1,9 @@
 // UhidSensor: the device's side of a display sensor, for a kernel that takes HID devices from programs (/dev/uhid).
 #pragma once
 
-#include "backends/linux/file_descriptor.h"
-#include "backends/simulated/hid_traits.h"
-#include "frame/value.h"
+#include "backends/linux/system/file_descriptor.h"
+#include "backends/simulated/scenario/hid_traits.h"
+#include "contract/value.h"
 
 #include <chrono>
 #include <cstddef>

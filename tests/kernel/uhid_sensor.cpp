@@ -6,7 +6,7 @@
 // standard error.
 #include "tests/kernel/uhid_device.h"
 
-#include "frame/message_format.h"
+#include "contract/message_format.h"
 
 #include <CLI/CLI.hpp>
 

@@ -1,8 +1,8 @@
 #include "tests/misbehaving/misbehaviour.h"
 
-#include "frame/diagnostic_contract.h"
-#include "frame/lab.h"
-#include "frame/log_channel.h"
+#include "contract/diagnostic_contract.h"
+#include "contract/lab.h"
+#include "contract/log_channel.h"
 
 #include <unistd.h>
 

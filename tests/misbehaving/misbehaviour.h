@@ -1,7 +1,7 @@
 // Misbehaviour: what a diagnostic of a test's plug-in does wrong, and when.
 #pragma once
 
-#include "frame/host_records.h"
+#include "contract/results.h"
 
 #include <string_view>
 

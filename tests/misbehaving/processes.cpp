@@ -1,7 +1,7 @@
 // Diagnostics that make processes, and that change their own.
 #include "tests/misbehaving/misbehaviour.h"
 
-#include "frame/log_channel.h"
+#include "contract/log_channel.h"
 
 #include <signal.h>
 #include <sys/resource.h>

@@ -1,10 +1,10 @@
 // Diagnostics whose results and log are out of measure.
 #include "tests/misbehaving/misbehaviour.h"
 
-#include "frame/diagnostic_contract.h"
-#include "frame/lab.h"
-#include "frame/log_channel.h"
-#include "frame/message_format.h"
+#include "contract/diagnostic_contract.h"
+#include "contract/lab.h"
+#include "contract/log_channel.h"
+#include "contract/message_format.h"
 
 #include <cstdint>
 #include <limits>

@@ -1,7 +1,7 @@
 // A plug-in whose one diagnostic passes, and tells its surroundings: they must not depend on what ran before it.
-#include "frame/diagnostic_contract.h"
-#include "frame/lab.h"
-#include "frame/log_channel.h"
+#include "contract/diagnostic_contract.h"
+#include "contract/lab.h"
+#include "contract/log_channel.h"
 
 #include <dirent.h>
 #include <sys/resource.h>

@@ -1,0 +1,258 @@
+#include "backends/linux/binding/binding.h"
+
+#include "backends/linux/binding/binding_counters.h"
+#include "base/json/json_cursor.h"
+#include "platform/capture_keys.h"
+
+#include <algorithm>
+#include <array>
+#include <initializer_list>
+#include <limits>
+#include <string_view>
+#include <utility>
+
+namespace quazor {
+namespace {
+
+constexpr std::array kPorts{port_type::BackFacingCamera, port_type::BackFacingTelephotoCamera,
+                            port_type::BackFacingSuperWideCamera, port_type::FrontFacingCamera,
+                            port_type::FrontFacingInfraredCamera};
+constexpr std::uint64_t kLargestSide = 65536;
+constexpr std::uint64_t kFewestBuffers = 2;
+constexpr std::uint64_t kMostBuffers = 32;       // VIDEO_MAX_FRAME of linux/videodev2.h
+constexpr std::size_t kLongestControlName = 31;  // v4l2_query_ext_ctrl has 32 bytes for it and its end
+constexpr std::size_t kLongestDriver = 15;       // v4l2_capability, likewise
+constexpr std::size_t kLongestCard = 31;
+constexpr std::size_t kLongestBusInfo = 31;
+constexpr std::uint64_t kLastMetadataByte = 16777215;  // of a buffer
+
+// A key that means nothing, but must be a text where it is there.
+void checkRemark(const JsonCursor& cursor, std::string_view key) {
+  if (const auto remark = cursor.find(key)) static_cast<void>(remark->text());
+}
+
+// All entries of an object whose keys are names.
+std::vector<std::pair<std::string, JsonCursor>> namedEntries(const JsonCursor& cursor) {
+  std::vector<std::pair<std::string, JsonCursor>> entries = cursor.entries();
+  for (const auto& [name, ignored] : entries) {
+    if (name.empty()) cursor.fail("an entry has no name; give it one.");
+  }
+  return entries;
+}
+
+std::string readControlName(const std::string& name, const JsonCursor& cursor) {
+  if (name.size() <= kLongestControlName) return name;
+  cursor.fail(inQuotes(name) + " is no control's name, which has at most " + std::to_string(kLongestControlName) +
+              " characters.");
+}
+
+std::optional<std::string> findDeviceText(const JsonCursor& cursor, std::string_view key, std::size_t longest) {
+  const std::optional<JsonCursor> found = cursor.find(key);
+  if (!found) return std::nullopt;
+  std::string text = found->text();
+  if (text.size() > longest) {
+    found->fail("no driver tells more than " + std::to_string(longest) + " characters here, and this has " +
+                std::to_string(text.size()) + "; quazor phone probe shows what it tells.");
+  }
+  return text;
+}
+
+std::optional<std::string> findControl(const JsonCursor& cursor, std::string_view key) {
+  const std::optional<JsonCursor> found = cursor.find(key);
+  return found ? std::optional(readControlName(found->text(), *found)) : std::nullopt;
+}
+
+VideoNodeMatch readMatch(const JsonCursor& cursor) {
+  cursor.allowKeys({"driver", "card", "busInfo"});
+  VideoNodeMatch match{findDeviceText(cursor, "driver", kLongestDriver), findDeviceText(cursor, "card", kLongestCard),
+                       findDeviceText(cursor, "busInfo", kLongestBusInfo)};
+  if (!match.driver && !match.card && !match.busInfo) {
+    cursor.fail("give at least one of \"driver\", \"card\" and \"busInfo\"; quazor phone probe shows them.");
+  }
+  return match;
+}
+
+std::vector<ControlSetting> readSettings(const JsonCursor& cursor) {
+  std::vector<ControlSetting> settings;
+  for (const auto& [name, value] : namedEntries(cursor)) {
+    settings.push_back(
+        {readControlName(name, value), value.isBoolean() ? std::int64_t{value.boolean()} : value.integer()});
+  }
+  return settings;
+}
+
+MetadataField readField(const std::string& key, const JsonCursor& cursor) {
+  cursor.allowKeys({"offset", "bytes", "shift", "mask"});
+  MetadataField field;
+  field.key = key;
+  field.offset = static_cast<std::uint32_t>(cursor.at("offset").integer(0, kLastMetadataByte));
+  if (const auto bytes = cursor.find("bytes")) {
+    field.bytes = static_cast<std::uint32_t>(bytes->integer(1, 8));
+    if ((field.bytes & (field.bytes - 1)) != 0) bytes->fail("must be 1, 2, 4 or 8.");
+  }
+  if (const auto shift = cursor.find("shift")) {
+    field.shift = static_cast<std::uint32_t>(shift->integer(0, field.bytes * 8U - 1));
+  }
+  if (const auto mask = cursor.find("mask")) {
+    const std::uint32_t bits = field.bytes * 8U - field.shift;  // that are left of the number
+    field.mask = mask->integer(1, std::numeric_limits<std::uint64_t>::max() >> (64U - bits));
+  }
+  return field;
+}
+
+MetadataBinding readMetadata(const JsonCursor& cursor) {
+  cursor.allowKeys({"constants", "node", "fields", "controls"});
+  MetadataBinding metadata;
+  if (const auto constants = cursor.find("constants")) {
+    for (const auto& [key, value] : namedEntries(*constants)) metadata.constants.set(key, value.scalar());
+  }
+  if (const auto node = cursor.find("node")) metadata.node = readMatch(*node);
+  if (const auto fields = cursor.find("fields")) {
+    if (!metadata.node) fields->fail("there is no metadata node to read them from; say by \"node\" which one it is.");
+    for (const auto& [key, value] : namedEntries(*fields)) metadata.fields.push_back(readField(key, value));
+  }
+  if (metadata.node && metadata.fields.empty()) {
+    cursor.at("node").fail("nothing is read from the metadata node; say by \"fields\" what is, or leave it out.");
+  }
+  if (const auto controls = cursor.find("controls")) {
+    for (const auto& [key, value] : namedEntries(*controls)) {
+      metadata.controls.push_back({key, readControlName(value.text(), value)});
+    }
+  }
+  return metadata;
+}
+
+ProjectorBinding readProjector(const JsonCursor& cursor) {
+  cursor.allowKeys({"on", "off", "modeControl", "patternControl", "currentControl"});
+  ProjectorBinding projector;
+  if (const auto on = cursor.find("on")) projector.on = readSettings(*on);
+  projector.off = readSettings(cursor.at("off"));
+  if (projector.off.empty()) cursor.at("off").fail("name the controls that put the light out.");
+  for (const ControlSetting& setting : projector.on) {
+    if (std::ranges::find(projector.off, setting.control, &ControlSetting::control) != projector.off.end()) continue;
+    cursor.at("on").at(setting.control).fail("\"off\" must set this control too, so that the light goes out again.");
+  }
+  projector.modeControl = findControl(cursor, "modeControl");
+  projector.patternControl = findControl(cursor, "patternControl");
+  projector.currentControl = findControl(cursor, "currentControl");
+  return projector;
+}
+
+ErrorCounterBinding readErrorCounter(const std::string& name, const JsonCursor& cursor) {
+  cursor.allowKeys({"file", "control"});
+  ErrorCounterBinding counter;
+  counter.name = name;
+  counter.control = findControl(cursor, "control");
+  if (const auto file = cursor.find("file")) counter.file = readPathText(*file);
+  if (counter.file.has_value() == counter.control.has_value()) {
+    cursor.fail("give either \"file\" or \"control\": where the count is read.");
+  }
+  return counter;
+}
+
+CameraBinding readCamera(const std::string& port, const JsonCursor& cursor) {
+  if (std::ranges::find(kPorts, port) == kPorts.end()) {
+    cursor.fail(inQuotes(port) + " is not a port" + suggestion(port, kPorts));
+  }
+  cursor.allowKeys({"description", "node", "size", "buffers", "controls", "metadata", "projector", "errorCounters"});
+  checkRemark(cursor, "description");
+  CameraBinding camera;
+  camera.port = port;
+  camera.node = readMatch(cursor.at("node"));
+  const JsonCursor size = cursor.at("size");
+  size.allowKeys({"width", "height"});
+  camera.width = static_cast<std::uint32_t>(size.at("width").integer(1, kLargestSide));
+  camera.height = static_cast<std::uint32_t>(size.at("height").integer(1, kLargestSide));
+  if (const auto buffers = cursor.find("buffers")) {
+    camera.buffers = static_cast<std::uint32_t>(buffers->integer(kFewestBuffers, kMostBuffers));
+  }
+  if (const auto controls = cursor.find("controls")) camera.controls = readSettings(*controls);
+  if (const auto metadata = cursor.find("metadata")) camera.metadata = readMetadata(*metadata);
+  if (const auto projector = cursor.find("projector")) camera.projector = readProjector(*projector);
+  if (const auto counters = cursor.find("errorCounters")) {
+    for (const auto& [name, value] : namedEntries(*counters)) {
+      camera.errorCounters.push_back(readErrorCounter(name, value));
+    }
+  }
+  return camera;
+}
+
+std::vector<CameraBinding> readCameras(const JsonCursor& cursor) {
+  std::vector<CameraBinding> cameras;
+  for (const auto& [port, value] : cursor.entries()) {
+    CameraBinding camera = readCamera(port, value);
+    const auto isSame = [&camera](const CameraBinding& other) { return other.node == camera.node; };
+    if (const auto same = std::ranges::find_if(cameras, isSame); same != cameras.end()) {
+      value.at("node").fail("this is the node of " + inQuotes(same->port) +
+                            "; every camera needs one of its own, told apart by its busInfo, for example.");
+    }
+    cameras.push_back(std::move(camera));
+  }
+  return cameras;
+}
+
+GroupBinding readGroup(const JsonCursor& cursor, const std::vector<CameraBinding>& cameras) {
+  cursor.allowKeys({"description", "cameras", "master"});
+  checkRemark(cursor, "description");
+  std::vector<std::string_view> ports;
+  ports.reserve(cameras.size());
+  for (const CameraBinding& camera : cameras) ports.push_back(camera.port);
+  GroupBinding group;
+  for (const JsonCursor& element : cursor.at("cameras").elements()) {
+    const std::string port = element.oneOf(ports, "a camera of this binding");
+    if (std::ranges::find(group.ports, port) != group.ports.end()) element.fail("the camera stands twice; leave one.");
+    group.ports.push_back(port);
+  }
+  if (group.ports.empty()) cursor.at("cameras").fail("a group needs at least one camera.");
+  const std::vector<std::string_view> members(group.ports.begin(), group.ports.end());
+  group.master = cursor.at("master").oneOf(members, "a camera of the group");
+  return group;
+}
+
+Binding bindingOf(const JsonCursor& document) {
+  document.allowKeys(
+      {"$schema", "title", "description", "cameras", "groups", "counterFiles", "tracepoints", "display"});
+  checkRemark(document, "$schema");
+  checkRemark(document, "description");
+  Binding binding;
+  binding.title = document.at("title").text();
+  if (const auto cameras = document.find("cameras")) binding.cameras = readCameras(*cameras);
+  if (const auto groups = document.find("groups")) {
+    for (const auto& [ignored, group] : groups->entries()) {
+      binding.groups.push_back(readGroup(group, binding.cameras));
+    }
+  }
+  if (const auto files = document.find("counterFiles")) binding.counterFiles = readAllCounterFiles(*files);
+  if (const auto tracepoints = document.find("tracepoints")) binding.tracepoints = readAllTracepoints(*tracepoints);
+  if (const auto display = document.find("display")) {
+    display->allowKeys({"description", "connector"});
+    checkRemark(*display, "description");
+    const JsonCursor connector = display->at("connector");
+    binding.display = DisplayBinding{connector.text()};
+    if (binding.display->connector.find('/') != std::string::npos || binding.display->connector.starts_with("card")) {
+      connector.fail("must be the connector's name without that of its card, as \"HDMI-A-1\".");
+    }
+  }
+  return binding;
+}
+
+}  // namespace
+
+std::optional<Binding> readBinding(const std::filesystem::path& file, std::string* problem) {
+  std::string text;
+  std::string complaint;
+  try {
+    text = readTextFile(file);
+    const nlohmann::ordered_json document = parseJson(text, file.string());
+    return bindingOf(JsonCursor(document));
+  } catch (const JsonProblem& found) {
+    complaint = found.what();
+    if (found.place()) {
+      complaint = file.string() + ":" + std::to_string(lineOfPath(text, *found.place())) + ": " + complaint;
+    }
+  }
+  if (problem != nullptr) *problem = std::move(complaint);
+  return std::nullopt;
+}
+
+}  // namespace quazor

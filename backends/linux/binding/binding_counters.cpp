@@ -1,0 +1,163 @@
+#include "backends/linux/binding/binding_counters.h"
+
+#include "backends/linux/binding/gauges.h"
+#include "backends/linux/binding/name_pattern.h"
+
+#include <algorithm>
+#include <array>
+#include <optional>
+#include <string>
+#include <string_view>
+#include <tuple>
+#include <utility>
+#include <vector>
+
+namespace quazor {
+namespace {
+
+constexpr std::string_view kNameAsKey = "{name}";
+constexpr std::size_t kLongestPath = 4095;  // PATH_MAX of linux/limits.h without its end
+
+struct Part {
+  std::string_view key;
+  std::optional<std::string> CounterFilesBinding::*text;
+};
+
+constexpr std::array<Part, 3> kParts{{{"group", &CounterFilesBinding::group},
+                                      {"subgroup", &CounterFilesBinding::subgroup},
+                                      {"name", &CounterFilesBinding::name}}};
+
+NamePattern patternIn(const JsonCursor& cursor) {
+  std::string problem;
+  std::optional<NamePattern> pattern = NamePattern::parse(cursor.text(), &problem);
+  if (!pattern) cursor.fail(inQuotes(cursor.text()) + " " + problem);
+  return *pattern;
+}
+
+// A folder's name with nothing in it but * that stands for anything.
+std::string readEventPattern(const JsonCursor& cursor, bool* isLiteral) {
+  std::string text = cursor.text();
+  if (text == "." || text == ".." || text.find_first_of(std::string_view("/\0", 2)) != std::string::npos) {
+    cursor.fail("must be the name of a folder of tracefs's events, not a path.");
+  }
+  const NamePattern pattern = patternIn(cursor);
+  *isLiteral = pattern.isLiteral();
+  for (const Part& part : kParts) {
+    if (pattern.hasPlaceholder(part.key)) cursor.fail("only * stands for any text here, not a placeholder.");
+  }
+  return text;
+}
+
+std::optional<std::string> findText(const JsonCursor& cursor, std::string_view key) {
+  const std::optional<JsonCursor> found = cursor.find(key);
+  return found ? std::optional(found->text()) : std::nullopt;
+}
+
+// A channel's group, subgroup or name, as the binding gives it.
+std::optional<std::string> findPart(const JsonCursor& cursor, std::string_view key) {
+  std::optional<std::string> text = findText(cursor, key);
+  for (const Part& part : kParts) {
+    const std::string placeholder = "{" + std::string(part.key) + "}";
+    if (!text || text->find(placeholder) == std::string::npos) continue;
+    cursor.at(key).fail("a placeholder stands for something in the path only; give the " + std::string(key) +
+                        " as it is.");
+  }
+  return text;
+}
+
+CounterFilesBinding readCounterFiles(const JsonCursor& cursor) {
+  cursor.allowKeys({"description", "path", "group", "subgroup", "name", "key"});
+  static_cast<void>(findText(cursor, "description"));
+  CounterFilesBinding files;
+  const JsonCursor pathCursor = cursor.at("path");
+  files.path = readPathText(pathCursor);
+  const NamePattern path = patternIn(pathCursor);
+  files.key = findText(cursor, "key");
+  const bool keyIsName = files.key == kNameAsKey;
+  if (files.key && !keyIsName && files.key->find_first_of(" \t\n{}") != std::string::npos) {
+    cursor.at("key").fail("must be one key of the file's lines, or \"{name}\" for a channel of each.");
+  }
+  for (const Part& part : kParts) {
+    const bool inPath = path.hasPlaceholder(part.key);
+    const bool inKey = keyIsName && part.key == "name";
+    const std::string placeholder = "\"{" + std::string(part.key) + "}\"";
+    files.*(part.text) = findPart(cursor, part.key);
+    if (inPath && inKey) cursor.at("key").fail("\"{name}\" stands in the path already; leave one.");
+    if ((inPath || inKey) && files.*(part.text)) {
+      cursor.at(part.key).fail("the placeholder " + placeholder + " says it already; leave one of the two.");
+    }
+    if (!inPath && !inKey && !(files.*(part.text))) {
+      cursor.fail("nothing says the channels' " + std::string(part.key) + "; give \"" + std::string(part.key) +
+                  "\", or " + placeholder + " in the path.");
+    }
+  }
+  const std::string_view key = files.key && !keyIsName ? std::string_view(*files.key) : std::string_view();
+  const std::string_view gauge = gaugeReason(files.path, key);
+  if (path.isLiteral() && !keyIsName && !gauge.empty()) {
+    pathCursor.fail("this number is no counter: " + std::string(gauge) + ", so it goes down too.");
+  }
+  return files;
+}
+
+TracepointBinding readTracepoints(const JsonCursor& cursor) {
+  cursor.allowKeys({"description", "system", "event", "group", "subgroup", "name"});
+  static_cast<void>(findText(cursor, "description"));
+  TracepointBinding tracepoints;
+  bool oneSystem = false;
+  bool oneEvent = false;
+  tracepoints.system = readEventPattern(cursor.at("system"), &oneSystem);
+  tracepoints.event = readEventPattern(cursor.at("event"), &oneEvent);
+  tracepoints.group = findText(cursor, "group");
+  tracepoints.subgroup = findText(cursor, "subgroup");
+  tracepoints.name = findText(cursor, "name");
+  if (tracepoints.name && !(oneSystem && oneEvent)) {
+    cursor.at("name").fail("several events would have this one name; leave it out, and each has its own.");
+  }
+  return tracepoints;
+}
+
+// Everything that an entry says.
+auto allOf(const CounterFilesBinding& one) { return std::tie(one.path, one.key, one.group, one.subgroup, one.name); }
+auto allOf(const TracepointBinding& one) { return std::tie(one.system, one.event, one.group, one.subgroup, one.name); }
+
+template <class Entry>
+std::vector<Entry> readAll(const JsonCursor& cursor, Entry (*read)(const JsonCursor&)) {
+  std::vector<Entry> entries;
+  for (const JsonCursor& element : cursor.elements()) {
+    Entry entry = read(element);
+    const auto isSame = [&entry](const Entry& other) { return allOf(other) == allOf(entry); };
+    if (const auto same = std::ranges::find_if(entries, isSame); same != entries.end()) {
+      element.fail("this is the same as entry " + std::to_string(same - entries.begin()) + " of the list; leave one.");
+    }
+    entries.push_back(std::move(entry));
+  }
+  return entries;
+}
+
+}  // namespace
+
+std::vector<CounterFilesBinding> readAllCounterFiles(const JsonCursor& cursor) {
+  return readAll(cursor, readCounterFiles);
+}
+
+std::vector<TracepointBinding> readAllTracepoints(const JsonCursor& cursor) { return readAll(cursor, readTracepoints); }
+
+std::string readPathText(const JsonCursor& cursor) {
+  std::string path = cursor.text();
+  if (!path.starts_with('/')) cursor.fail("must be an absolute path, as \"/sys/...\".");
+  if (path.size() > kLongestPath) {
+    cursor.fail("is longer than a path can be, which is " + std::to_string(kLongestPath) + " bytes.");
+  }
+  if (path.find('\0') != std::string::npos) cursor.fail("no path can hold the character \\u0000.");
+  for (std::size_t begin = 1; begin <= path.size();) {
+    const std::size_t end = std::min(path.find('/', begin), path.size());
+    const std::string component = path.substr(begin, end - begin);
+    if (component.empty() || component == "." || component == "..") {
+      cursor.fail("must be a path without \"//\", \".\", \"..\" and a \"/\" at its end.");
+    }
+    begin = end + 1;
+  }
+  return path;
+}
+
+}  // namespace quazor

@@ -1,0 +1,408 @@
+#include "backends/linux/binding/binding.h"
+
+#include <gmock/gmock.h>
+#include <gtest/gtest.h>
+
+#include <chrono>
+#include <filesystem>
+#include <fstream>
+#include <string>
+#include <string_view>
+
+#ifndef QUAZOR_BINDING_FOLDER
+#error "the build names the folder of the bindings"
+#endif
+
+namespace quazor {
+namespace {
+
+namespace fs = std::filesystem;
+using ::testing::ElementsAre;
+using ::testing::Field;
+using ::testing::IsEmpty;
+
+class BindingTest : public ::testing::Test {
+ protected:
+  BindingTest()
+      : file_(fs::path(::testing::TempDir()) /
+              ("quazor-binding-" + std::to_string(std::chrono::steady_clock::now().time_since_epoch().count()))) {}
+  ~BindingTest() override { fs::remove(file_); }
+
+  std::optional<Binding> read(std::string_view text, std::string* problem = nullptr) {
+    std::ofstream(file_, std::ios::binary) << text;
+    return readBinding(file_, problem);
+  }
+  // What is wrong, with "F" for the file; "nothing" when it was read.
+  std::string problemOf(std::string_view text) {
+    std::string problem;
+    if (read(text, &problem)) return "nothing";
+    const std::size_t at = problem.find(file_.string());
+    return at == std::string::npos ? problem : problem.replace(at, file_.string().size(), "F");
+  }
+
+  const fs::path file_;
+};
+
+// A binding with one more entry in its second line.
+std::string with(const std::string& entry) { return "{\"title\": \"t\",\n" + entry + "}"; }
+// One with a camera, which has one more entry in its third line.
+std::string withCamera(const std::string& entry) {
+  return with(R"("cameras": {"BackFacingCamera": {"node": {"card": "c"}, "size": {"width": 4, "height": 2},)"
+              "\n" +
+              entry + "}}");
+}
+std::string withMetadata(const std::string& entries) { return withCamera("\"metadata\": {" + entries + "}"); }
+std::string withField(const std::string& entries) {
+  return withMetadata(R"("node": {"card": "m"}, "fields": {"K": {)" + entries + "}}");
+}
+std::string withProjector(const std::string& entries) { return withCamera("\"projector\": {" + entries + "}"); }
+std::string withGroup(const std::string& entries) {
+  return withCamera("\"buffers\": 4}}, \"groups\": {\"g\": {" + entries);
+}
+std::string withFiles(const std::string& entries) { return with("\"counterFiles\": [{" + entries + "}]"); }
+// The channels' group and subgroup are given, so that their name is left.
+std::string withPath(const std::string& path, const std::string& entries = "\"name\": \"n\"") {
+  return withFiles("\"path\": \"" + path + "\", \"group\": \"g\", \"subgroup\": \"s\", " + entries);
+}
+
+TEST_F(BindingTest, ReadsAllThereIsToSay) {
+  std::string problem;
+  const std::optional<Binding> binding = read(R"({
+    "$schema": "binding.schema.json", "title": "Everything", "description": "d",
+    "cameras": {
+      "FrontFacingInfraredCamera": {
+        "description": "d",
+        "node": {"driver": "dr", "card": "ca", "busInfo": "bu"},
+        "size": {"width": 640, "height": 360},
+        "buffers": 32,
+        "controls": {"B": -5, "A": true},
+        "metadata": {
+          "constants": {"I": 1, "D": 0.5, "S": "s", "B": true},
+          "node": {"card": "meta"},
+          "fields": {"F": {"offset": 3, "bytes": 8, "shift": 0, "mask": 18446744073709551615}, "G": {"offset": 0}, "H": {"offset": 4, "bytes": 8, "shift": 63, "mask": 1}},
+          "controls": {"K": "Gain"}
+        },
+        "projector": {"on": {"L": 1}, "off": {"L": 0, "M": 0}, "modeControl": "m", "patternControl": "p",
+                      "currentControl": "c"},
+        "errorCounters": {"X": {"file": "/sys/x"}, "Y": {"control": "E"}}
+      },
+      "BackFacingCamera": {"node": {"card": "ca"}, "size": {"width": 1, "height": 65536}}
+    },
+    "groups": {"z": {"description": "d", "cameras": ["FrontFacingInfraredCamera", "BackFacingCamera"],
+                     "master": "BackFacingCamera"}},
+    "counterFiles": [{"description": "d", "path": "/a/{group}/x{subgroup}y/{name}-*"},
+                     {"path": "/proc/f", "group": "g", "subgroup": "s", "key": "{name}"},
+                     {"path": "/proc/f", "group": "g", "subgroup": "s", "name": "n", "key": "k"}],
+    "tracepoints": [{"system": "v4l2", "event": "*"},
+                    {"description": "d", "system": "a", "event": "b", "group": "g", "subgroup": "s", "name": "n"}],
+    "display": {"description": "d", "connector": "DSI-1"}
+  })",
+                                              &problem);
+  ASSERT_TRUE(binding) << problem;
+  EXPECT_EQ(binding->title, "Everything");
+
+  ASSERT_EQ(binding->cameras.size(), 2U);
+  const CameraBinding& camera = binding->cameras[0];
+  EXPECT_EQ(camera.port, "FrontFacingInfraredCamera");
+  EXPECT_EQ(camera.node, (VideoNodeMatch{"dr", "ca", "bu"}));
+  EXPECT_EQ(camera.width, 640U);
+  EXPECT_EQ(camera.height, 360U);
+  EXPECT_EQ(camera.buffers, 32U);
+  ASSERT_EQ(camera.controls.size(), 2U);
+  EXPECT_EQ(camera.controls[0].control, "B");
+  EXPECT_EQ(camera.controls[0].value, -5);
+  EXPECT_EQ(camera.controls[1].control, "A");
+  EXPECT_EQ(camera.controls[1].value, 1);
+
+  const Dictionary constants{{"I", std::int64_t{1}}, {"D", 0.5}, {"S", "s"}, {"B", true}};
+  EXPECT_EQ(camera.metadata.constants, constants);
+  EXPECT_EQ(camera.metadata.node, (VideoNodeMatch{std::nullopt, "meta", std::nullopt}));
+  ASSERT_EQ(camera.metadata.fields.size(), 3U);
+  EXPECT_EQ(camera.metadata.fields[0].key, "F");
+  EXPECT_EQ(camera.metadata.fields[0].offset, 3U);
+  EXPECT_EQ(camera.metadata.fields[0].bytes, 8U);
+  EXPECT_EQ(camera.metadata.fields[0].shift, 0U);
+  EXPECT_EQ(camera.metadata.fields[0].mask, ~std::uint64_t{0});
+  EXPECT_EQ(camera.metadata.fields[1].bytes, 1U);
+  EXPECT_EQ(camera.metadata.fields[1].mask, std::nullopt);
+  EXPECT_EQ(camera.metadata.fields[2].shift, 63U);
+  EXPECT_EQ(camera.metadata.fields[2].mask, 1U);
+  ASSERT_EQ(camera.metadata.controls.size(), 1U);
+  EXPECT_EQ(camera.metadata.controls[0].key, "K");
+  EXPECT_EQ(camera.metadata.controls[0].control, "Gain");
+
+  ASSERT_TRUE(camera.projector);
+  EXPECT_THAT(camera.projector->on, ElementsAre(Field(&ControlSetting::control, "L")));
+  EXPECT_THAT(camera.projector->off,
+              ElementsAre(Field(&ControlSetting::control, "L"), Field(&ControlSetting::control, "M")));
+  EXPECT_EQ(camera.projector->modeControl, "m");
+  EXPECT_EQ(camera.projector->patternControl, "p");
+  EXPECT_EQ(camera.projector->currentControl, "c");
+  ASSERT_EQ(camera.errorCounters.size(), 2U);
+  EXPECT_EQ(camera.errorCounters[0].name, "X");
+  EXPECT_EQ(camera.errorCounters[0].file, "/sys/x");
+  EXPECT_EQ(camera.errorCounters[0].control, std::nullopt);
+  EXPECT_EQ(camera.errorCounters[1].file, std::nullopt);
+  EXPECT_EQ(camera.errorCounters[1].control, "E");
+
+  const CameraBinding& second = binding->cameras[1];
+  EXPECT_EQ(second.buffers, 4U);
+  EXPECT_FALSE(second.projector);
+  EXPECT_FALSE(second.metadata.node);
+  ASSERT_EQ(binding->groups.size(), 1U);
+  EXPECT_THAT(binding->groups[0].ports, ElementsAre("FrontFacingInfraredCamera", "BackFacingCamera"));
+  EXPECT_EQ(binding->groups[0].master, "BackFacingCamera");
+
+  ASSERT_EQ(binding->counterFiles.size(), 3U);
+  EXPECT_EQ(binding->counterFiles[0].path, "/a/{group}/x{subgroup}y/{name}-*");
+  EXPECT_EQ(binding->counterFiles[0].key, std::nullopt);
+  EXPECT_EQ(binding->counterFiles[1].group, "g");
+  EXPECT_EQ(binding->counterFiles[1].subgroup, "s");
+  EXPECT_EQ(binding->counterFiles[1].name, std::nullopt);
+  EXPECT_EQ(binding->counterFiles[1].key, "{name}");
+  EXPECT_EQ(binding->counterFiles[2].name, "n");
+  EXPECT_EQ(binding->counterFiles[2].key, "k");
+  ASSERT_EQ(binding->tracepoints.size(), 2U);
+  EXPECT_EQ(binding->tracepoints[0].system, "v4l2");
+  EXPECT_EQ(binding->tracepoints[0].event, "*");
+  EXPECT_EQ(binding->tracepoints[0].group, std::nullopt);
+  EXPECT_EQ(binding->tracepoints[1].group, "g");
+  EXPECT_EQ(binding->tracepoints[1].subgroup, "s");
+  EXPECT_EQ(binding->tracepoints[1].name, "n");
+  ASSERT_TRUE(binding->display);
+  EXPECT_EQ(binding->display->connector, "DSI-1");
+}
+
+TEST_F(BindingTest, ATitleIsEnough) {
+  const std::optional<Binding> binding = read(R"({"title": "t"})");
+  ASSERT_TRUE(binding);
+  EXPECT_THAT(binding->cameras, IsEmpty());
+  EXPECT_FALSE(binding->display);
+}
+
+struct Refused {
+  const char* what;
+  std::string text;
+  std::string problem;
+};
+
+TEST_F(BindingTest, RefusesWhatCamerasCannotBe) {
+  const std::string camera = "F:3: cameras.BackFacingCamera";
+  const Refused kRows[] = {
+      {"no port", with(R"("cameras": {"BackFacingCamra": {}})"),
+       "F:2: cameras.BackFacingCamra: \"BackFacingCamra\" is not a port; did you mean \"BackFacingCamera\"?"},
+      {"no node", with(R"("cameras": {"BackFacingCamera": {"size": {"width": 1, "height": 1}}})"),
+       "F:2: cameras.BackFacingCamera: the key \"node\" is missing."},
+      {"a node that is anything", with(R"("cameras": {"BackFacingCamera": {"node": {}}})"),
+       "F:2: cameras.BackFacingCamera.node: give at least one of \"driver\", \"card\" and \"busInfo\"; quazor phone "
+       "probe shows them."},
+      {"no size", with(R"("cameras": {"BackFacingCamera": {"node": {"card": "c"}}})"),
+       "F:2: cameras.BackFacingCamera: the key \"size\" is missing."},
+      {"the same port twice", withCamera("\"buffers\": 2}, \"BackFacingCamera\": {"),
+       "F:3: cameras: the key \"BackFacingCamera\" stands twice; leave one of the two."},
+      {"the same node twice",
+       withCamera(R"("buffers": 2}, "FrontFacingCamera": {"node": {"card": "c"}, "size": {"width": 4, "height": 2})"),
+       "F:3: cameras.FrontFacingCamera.node: this is the node of \"BackFacingCamera\"; every camera needs one of its "
+       "own, told apart by its busInfo, for example."},
+      {"one buffer", withCamera("\"buffers\": 1"), camera + ".buffers: must be an integer from 2 to 32, not 1."},
+      {"33 buffers", withCamera("\"buffers\": 33"), camera + ".buffers: must be an integer from 2 to 32, not 33."},
+      {"a width of 0",
+       with(R"("cameras": {"BackFacingCamera": {"node": {"card": "c"}, "size": {"width": 0, "height": 2}}})"),
+       "F:2: cameras.BackFacingCamera.size.width: must be an integer from 1 to 65536, not 0."},
+      {"an unknown key", withCamera("\n\"bufers\": 4"),
+       "F:4: cameras.BackFacingCamera: there is no key \"bufers\"; did you mean \"buffers\"?"},
+      {"a control's name that is too long", withCamera("\"controls\": {\"" + std::string(32, 'x') + "\": 1}"),
+       camera + ".controls." + std::string(32, 'x') + ": \"" + std::string(32, 'x') +
+           "\" is no control's name, which has at most 31 characters."},
+      {"a control's value that is no integer", withCamera("\"controls\": {\"Gain\": 1.5}"),
+       camera + ".controls.Gain: must be a signed 64-bit integer, not 1.5."},
+      {"a counter from nowhere", withCamera("\"errorCounters\": {\"E\": {}}"),
+       camera + ".errorCounters.E: give either \"file\" or \"control\": where the count is read."},
+      {"a counter from two places", withCamera("\"errorCounters\": {\"E\": {\"file\": \"/a\", \"control\": \"b\"}}"),
+       camera + ".errorCounters.E: give either \"file\" or \"control\": where the count is read."},
+      {"a control without a name", withCamera("\"controls\": {\"\": 1}"),
+       camera + ".controls: an entry has no name; give it one."},
+      {"a counter without a name", withCamera("\"errorCounters\": {\"\": {\"control\": \"b\"}}"),
+       camera + ".errorCounters: an entry has no name; give it one."},
+      {"a counter in a file by a way back", withCamera("\"errorCounters\": {\"E\": {\"file\": \"/a/../b\"}}"),
+       camera + ".errorCounters.E.file: must be a path without \"//\", \".\", \"..\" and a \"/\" at its end."},
+      {"a description that is no text", withCamera("\"description\": 5"),
+       camera + ".description: must be a string that is not empty, not 5."},
+      {"a driver that none can have",
+       with(R"("cameras": {"BackFacingCamera": {"node": {"driver": "0123456789abcdef"}}})"),
+       "F:2: cameras.BackFacingCamera.node.driver: no driver tells more than 15 characters here, and this has 16; "
+       "quazor phone probe shows what it tells."},
+      {"a card that none can have",
+       with(R"("cameras": {"BackFacingCamera": {"node": {"card": ")" + std::string(32, 'x') + R"("}}})"),
+       "F:2: cameras.BackFacingCamera.node.card: no driver tells more than 31 characters here, and this has 32; "
+       "quazor phone probe shows what it tells."},
+      {"a bus that none can have",
+       with(R"("cameras": {"BackFacingCamera": {"node": {"busInfo": ")" + std::string(32, 'x') + R"("}}})"),
+       "F:2: cameras.BackFacingCamera.node.busInfo: no driver tells more than 31 characters here, and this has 32; "
+       "quazor phone probe shows what it tells."},
+      {"a counter in a relative file", withCamera("\"errorCounters\": {\"E\": {\"file\": \"a\"}}"),
+       camera + ".errorCounters.E.file: must be an absolute path, as \"/sys/...\"."},
+  };
+  for (const Refused& row : kRows) EXPECT_EQ(problemOf(row.text), row.problem) << row.what;
+}
+
+TEST_F(BindingTest, RefusesMetadataThatCannotBe) {
+  const std::string metadata = "F:3: cameras.BackFacingCamera.metadata";
+  const Refused kRows[] = {
+      {"fields of no node", withMetadata(R"("fields": {"K": {"offset": 0}})"),
+       metadata + ".fields: there is no metadata node to read them from; say by \"node\" which one it is."},
+      {"a node without fields", withMetadata(R"("node": {"card": "m"})"),
+       metadata + ".node: nothing is read from the metadata node; say by \"fields\" what is, or leave it out."},
+      {"a node with no fields", withMetadata(R"("node": {"card": "m"}, "fields": {})"),
+       metadata + ".node: nothing is read from the metadata node; say by \"fields\" what is, or leave it out."},
+      {"a constant that is a list", withMetadata(R"("constants": {"K": []})"),
+       metadata + ".constants.K: must be a number, a string, true or false, not an array."},
+      {"an offset that is too large", withField("\"offset\": 16777216"),
+       metadata + ".fields.K.offset: must be an integer from 0 to 16777215, not 16777216."},
+      {"three bytes", withField("\"offset\": 1, \"bytes\": 3"), metadata + ".fields.K.bytes: must be 1, 2, 4 or 8."},
+      {"nine bytes", withField("\"offset\": 1, \"bytes\": 9"),
+       metadata + ".fields.K.bytes: must be an integer from 1 to 8, not 9."},
+      {"everything shifted out", withField("\"offset\": 1, \"bytes\": 2, \"shift\": 16"),
+       metadata + ".fields.K.shift: must be an integer from 0 to 15, not 16."},
+      {"everything masked out", withField("\"offset\": 1, \"mask\": 0"),
+       metadata + ".fields.K.mask: must be an integer from 1 to 255, not 0."},
+      {"a mask of bits that the number does not have",
+       withField(R"("offset": 1, "bytes": 2, "shift": 4, "mask": 4096)"),
+       metadata + ".fields.K.mask: must be an integer from 1 to 4095, not 4096."},
+      {"a constant without a name", withMetadata(R"("constants": {"": 1})"),
+       metadata + ".constants: an entry has no name; give it one."},
+      {"a field without a name", withMetadata(R"("node": {"card": "m"}, "fields": {"": {"offset": 0}})"),
+       metadata + ".fields: an entry has no name; give it one."},
+      {"a control's key without a name", withMetadata(R"("controls": {"": "Gain"})"),
+       metadata + ".controls: an entry has no name; give it one."},
+      {"a projector that is never off", withProjector("\"on\": {\"L\": 1}"),
+       "F:3: cameras.BackFacingCamera.projector: the key \"off\" is missing."},
+      {"nothing to put it out by", withProjector("\"off\": {}"),
+       "F:3: cameras.BackFacingCamera.projector.off: name the controls that put the light out."},
+      {"a control that stays on", withProjector("\"on\": {\"L\": 1, \"M\": 1}, \"off\": {\"L\": 0}"),
+       "F:3: cameras.BackFacingCamera.projector.on.M: \"off\" must set this control too, so that the light goes out "
+       "again."},
+  };
+  for (const Refused& row : kRows) EXPECT_EQ(problemOf(row.text), row.problem) << row.what;
+}
+
+TEST_F(BindingTest, RefusesGroupsThatCannotBe) {
+  const Refused kRows[] = {
+      {"a camera that is not there", withGroup(R"("cameras": ["FrontFacingCamera"], "master": "FrontFacingCamera")"),
+       "F:3: groups.g.cameras[0]: \"FrontFacingCamera\" is not a camera of this binding; did you "
+       "mean \"BackFacingCamera\"?"},
+      {"no camera", withGroup(R"("cameras": [], "master": "BackFacingCamera")"),
+       "F:3: groups.g.cameras: a group needs at least one camera."},
+      {"a camera twice",
+       withGroup(R"("cameras": ["BackFacingCamera", "BackFacingCamera"], "master": "BackFacingCamera")"),
+       "F:3: groups.g.cameras[1]: the camera stands twice; leave one."},
+      {"another master", withGroup(R"("cameras": ["BackFacingCamera"], "master": "FrontFacingCamera")"),
+       "F:3: groups.g.master: \"FrontFacingCamera\" is not a camera of the group; did you mean \"BackFacingCamera\"?"},
+      {"a description that is no text", withGroup("\"description\": []"),
+       "F:3: groups.g.description: must be a string that is not empty, not an array."},
+      {"no master", withGroup(R"("cameras": ["BackFacingCamera"])"), "F:3: groups.g: the key \"master\" is missing."},
+  };
+  for (const Refused& row : kRows) EXPECT_EQ(problemOf(row.text), row.problem) << row.what;
+}
+
+TEST_F(BindingTest, RefusesCountersThatCannotBe) {
+  const std::string files = "F:2: counterFiles[0]";
+  const std::string shape = files + ".path: must be a path without \"//\", \".\", \"..\" and a \"/\" at its end.";
+  const Refused kRows[] = {
+      {"a relative path", withPath("a"), files + ".path: must be an absolute path, as \"/sys/...\"."},
+      {"nothing between slashes", withPath("/a//b"), shape},
+      {"a slash at the end", withPath("/a/"), shape},
+      {"the folder itself", withPath("/a/./b"), shape},
+      {"the folder above", withPath("/a/../b"), shape},
+      {"a path that is too long", withPath("/" + std::string(4095, 'a')),
+       files + ".path: is longer than a path can be, which is 4095 bytes."},
+      {"a path that ends within", withPath("/a\\u0000b"), files + ".path: no path can hold the character \\u0000."},
+      {"a placeholder outside of the path", withFiles(R"("path": "/a/{name}", "group": "x{name}", "subgroup": "s")"),
+       files + ".group: a placeholder stands for something in the path only; give the group as it is."},
+      {"a description that is no text", withPath("/a", R"("name": "n", "description": 1)"),
+       files + ".description: must be a string that is not empty, not 1."},
+      {"the same files twice", with(R"("counterFiles": [{"path": "/a", "group": "g", "subgroup": "s", "name": "n"},
+                                {"path": "/a", "group": "g", "subgroup": "s", "name": "m"},
+                                {"path": "/a", "group": "g", "subgroup": "s", "name": "m", "description": "d"}])"),
+       "F:4: counterFiles[2]: this is the same as entry 1 of the list; leave one."},
+      {"the same tracepoint twice", with(R"("tracepoints": [{"system": "a", "event": "b"},
+                                                            {"system": "a", "event": "b"}])"),
+       "F:3: tracepoints[1]: this is the same as entry 0 of the list; leave one."},
+      {"a tracepoint's description that is no text", with(R"("tracepoints": [{"description": {}}])"),
+       "F:2: tracepoints[0].description: must be a string that is not empty, not an object."},
+      {"a display's description that is no text", with(R"("display": {"description": 1, "connector": "DSI-1"})"),
+       "F:2: display.description: must be a string that is not empty, not 1."},
+      {"an unknown placeholder", withPath("/{nmae}", "\"key\": \"k\""),
+       files + ".path: \"/{nmae}\" holds the unknown placeholder \"{nmae}\"; known are \"{group}\", \"{subgroup}\" and "
+               "\"{name}\"."},
+      {"a placeholder twice", withPath("/{name}/{name}"),
+       files + ".path: \"/{name}/{name}\" holds the placeholder \"{name}\" twice; leave one."},
+      {"half a brace", withPath("/{name"), files + ".path: \"/{name\" holds a brace without its other one."},
+      {"the other half", withPath("/name}"), files + ".path: \"/name}\" holds a brace without its other one."},
+      {"two that touch", withPath("/{name}*"),
+       files + ".path: \"/{name}*\" has nothing between two parts that stand for any text; where one ends cannot be "
+               "known."},
+      {"no name", withPath("/a", "\"key\": \"k\""),
+       files + ": nothing says the channels' name; give \"name\", or \"{name}\" in the path."},
+      {"a name said twice", withPath("/{name}"),
+       files + ".name: the placeholder \"{name}\" says it already; leave one of the two."},
+      {"a name said by the key too", withPath("/a", R"("name": "n", "key": "{name}")"),
+       files + ".name: the placeholder \"{name}\" says it already; leave one of the two."},
+      {"a name said by path and key", withPath("/{name}", "\"key\": \"{name}\""),
+       files + ".key: \"{name}\" stands in the path already; leave one."},
+      {"a key of two words", withPath("/a", R"("name": "n", "key": "a b")"),
+       files + ".key: must be one key of the file's lines, or \"{name}\" for a channel of each."},
+      {"a number that goes down", withPath("/proc/vmstat", R"("name": "n", "key": "nr_free_pages")"),
+       files + ".path: this number is no counter: it tells how much there is now, so it goes down too."},
+      {"a tracepoint without event", with(R"("tracepoints": [{"system": "a"}])"),
+       "F:2: tracepoints[0]: the key \"event\" is missing."},
+      {"a tracepoint's system that leads back", with(R"("tracepoints": [{"system": "..", "event": "a"}])"),
+       "F:2: tracepoints[0].system: must be the name of a folder of tracefs's events, not a path."},
+      {"a tracepoint's event that is a path", with(R"("tracepoints": [{"system": "a", "event": "b/../c"}])"),
+       "F:2: tracepoints[0].event: must be the name of a folder of tracefs's events, not a path."},
+      {"a placeholder in a tracepoint", with(R"("tracepoints": [{"system": "{group}", "event": "a"}])"),
+       "F:2: tracepoints[0].system: only * stands for any text here, not a placeholder."},
+      {"one name for many", with(R"("tracepoints": [{"system": "a", "event": "b*", "name": "n"}])"),
+       "F:2: tracepoints[0].name: several events would have this one name; leave it out, and each has its own."},
+      {"one name for many systems", with(R"("tracepoints": [{"system": "*", "event": "b", "name": "n"}])"),
+       "F:2: tracepoints[0].name: several events would have this one name; leave it out, and each has its own."},
+      {"a connector with its card", with(R"("display": {"connector": "card0-DSI-1"})"),
+       "F:2: display.connector: must be the connector's name without that of its card, as \"HDMI-A-1\"."},
+      {"a connector that is a path", with(R"("display": {"connector": "a/b"})"),
+       "F:2: display.connector: must be the connector's name without that of its card, as \"HDMI-A-1\"."},
+  };
+  for (const Refused& row : kRows) EXPECT_EQ(problemOf(row.text), row.problem) << row.what;
+}
+
+TEST_F(BindingTest, RefusesWhatIsNoBinding) {
+  const Refused kRows[] = {
+      {"no JSON", "{\n]", "F:2: this is not JSON: "},
+      {"no object", "[]", "F:1: the document: must be an object, not an array."},
+      {"no title", "{}", "F:1: the document: the key \"title\" is missing."},
+      {"an empty title", "{\n\"title\": \"\"}", "F:2: title: must be a string that is not empty, not \"\"."},
+      {"a description that is no text", with("\"description\": 1"),
+       "F:2: description: must be a string that is not empty, not 1."},
+      {"a schema that is no text", with("\"$schema\": 1"), "F:2: $schema: must be a string that is not empty, not 1."},
+      {"an unknown key", with("\"camera\": {}"),
+       "F:2: the document: there is no key \"camera\"; did you mean \"cameras\"?"},
+  };
+  for (const Refused& row : kRows) EXPECT_THAT(problemOf(row.text), ::testing::StartsWith(row.problem)) << row.what;
+  std::string problem;
+  EXPECT_FALSE(readBinding("nowhere.json", &problem));
+  EXPECT_EQ(problem, "nowhere.json: there is no such file.");
+  EXPECT_FALSE(readBinding("nowhere.json", nullptr));
+}
+
+TEST(Bindings, ThatAreInstalledCanBeRead) {
+  std::size_t count = 0;
+  for (const auto& entry : fs::directory_iterator(QUAZOR_BINDING_FOLDER)) {
+    if (entry.path().filename() == "binding.schema.json") continue;
+    std::string problem;
+    EXPECT_TRUE(readBinding(entry.path(), &problem)) << problem;
+    ++count;
+  }
+  EXPECT_EQ(count, 2U);
+}
+
+}  // namespace
+}  // namespace quazor

@@ -1,0 +1,85 @@
+#include "backends/linux/binding/name_pattern.h"
+
+#include <gtest/gtest.h>
+
+#include <string>
+
+namespace quazor {
+namespace {
+
+// "group|subgroup|name" of what the placeholders stood for, "-" for none; "no" when the name does not match.
+std::string matched(std::string_view pattern, std::string_view name) {
+  std::string problem;
+  const std::optional<NamePattern> parsed = NamePattern::parse(pattern, &problem);
+  if (!parsed) return problem;
+  ChannelNames names;
+  const bool matches = parsed->match(name, &names);
+  EXPECT_EQ(parsed->matches(name), matches) << pattern << " " << name;
+  if (!matches) return "no";
+  return names.group.value_or("-") + "|" + names.subgroup.value_or("-") + "|" + names.name.value_or("-");
+}
+
+TEST(NamePattern, TellsWhatThePlaceholdersStoodFor) {
+  const struct {
+    const char* pattern;
+    const char* name;
+    const char* expected;
+  } kRows[] = {
+      {"cpu.stat", "cpu.stat", "-|-|-"},
+      {"cpu.stat", "cpu.sta", "no"},
+      {"", "", "-|-|-"},
+      {"{name}", "Number ZE FAULT_A", "-|-|Number ZE FAULT_A"},
+      {"{name}", "", "no"},
+      {"*", "", "-|-|-"},
+      {"*", "anything", "-|-|-"},
+      {"a*", "a", "-|-|-"},
+      {"a*", "b", "no"},
+      {"*a", "ba", "-|-|-"},
+      {"*a", "ab", "no"},
+      {"aa*a", "aa", "no"},
+      {"a{name}a", "aa", "no"},
+      {"a{name}a", "aaa", "-|-|a"},
+      {"{group}-{name}", "a-b-c", "a|-|b-c"},
+      {"{group}-{name}", "--c", "-|-|c"},
+      {"{group}-{name}", "-c", "no"},
+      {"{group}-{name}", "a-", "no"},
+      {"{group}-{name}", "", "no"},
+      {"{group}/{subgroup}/x_{name}_y", "g/s/x_n_y", "g|s|n"},
+      {"*_{name}_*", "ab_cd_ef_g", "-|-|cd"},
+      {"*ab", "aab", "-|-|-"},
+      {"*a*b", "xaxb", "-|-|-"},
+      {"*a*b", "xbxa", "no"},
+      {"*a*bc", "abc", "-|-|-"},
+      {"*ab*bc", "abc", "no"},
+  };
+  for (const auto& row : kRows)
+    EXPECT_EQ(matched(row.pattern, row.name), row.expected) << row.pattern << " " << row.name;
+}
+
+TEST(NamePattern, LeavesTheNamesWhereNothingMatches) {
+  ChannelNames names;
+  names.group = "before";
+  EXPECT_FALSE(NamePattern::parse("{group}-{name}b", nullptr)->match("a-c", &names));
+  EXPECT_EQ(names.group, "before");
+}
+
+TEST(NamePattern, KnowsItsPlaceholders) {
+  const NamePattern pattern = *NamePattern::parse("a*b{name}", nullptr);
+  EXPECT_TRUE(pattern.hasPlaceholder("name"));
+  EXPECT_FALSE(pattern.hasPlaceholder("group"));
+  EXPECT_FALSE(pattern.isLiteral());
+  EXPECT_TRUE(NamePattern::parse("ab", nullptr)->isLiteral());
+}
+
+TEST(NamePattern, RefusesWhatIsNone) {
+  EXPECT_FALSE(NamePattern::parse("{", nullptr));
+  EXPECT_EQ(matched("a{b", ""), "holds a brace without its other one.");
+  EXPECT_EQ(matched("a}b", ""), "holds a brace without its other one.");
+  EXPECT_EQ(matched("**", ""),
+            "has nothing between two parts that stand for any text; where one ends cannot be known.");
+  EXPECT_EQ(matched("{}", ""),
+            "holds the unknown placeholder \"{}\"; known are \"{group}\", \"{subgroup}\" and \"{name}\".");
+}
+
+}  // namespace
+}  // namespace quazor

@@ -1,0 +1,72 @@
+// CameraBuffers: the mapped buffers of one video or metadata node, from the request for them to their release.
+#pragma once
+
+#include "backends/linux/video/video_node.h"
+
+#include <cstddef>
+#include <cstdint>
+#include <memory>
+#include <span>
+#include <vector>
+
+namespace quazor {
+
+// What a dequeued buffer says of itself.
+struct DequeuedBuffer {
+  std::uint32_t index = 0;
+  std::uint32_t bytesUsed = 0;
+  std::uint32_t sequence = 0;
+  bool isBad = false;                     // the driver found an error in the data
+  std::chrono::nanoseconds timestamp{0};  // on the monotonic clock
+};
+
+// Whoever requested buffers of a node keeps others from setting its format until every buffer is unmapped and given
+// back; so release() does all of that whatever fails, and so does the destructor.
+//
+// Thread: one at a time.
+class CameraBuffers final {
+ public:
+  // `type` is V4L2_BUF_TYPE_VIDEO_CAPTURE or V4L2_BUF_TYPE_META_CAPTURE.
+  CameraBuffers(std::shared_ptr<OpenedVideoNode> node, std::uint32_t type);
+  CameraBuffers(const CameraBuffers&) = delete;
+  CameraBuffers& operator=(const CameraBuffers&) = delete;
+  ~CameraBuffers();
+
+  const OpenedVideoNode& node() const { return *node_; }
+
+  // Requests, maps and queues buffers; the driver may give more or fewer than `count`.
+  bool prepare(std::uint32_t count, DiagnosticErrorPtr* error);
+  bool streamOn(DiagnosticErrorPtr* error);
+  // Ends the stream, unmaps the buffers and gives them back. False, with the first error, when the driver refused
+  // any of that; nothing is ours afterwards even so, as far as the system can tell. Does nothing a second time.
+  bool release(DiagnosticErrorPtr* error);
+
+  // Takes a filled buffer. 0, or the error number: EAGAIN when there is none at the moment.
+  int dequeue(DequeuedBuffer& buffer);
+  // What is in it, until it is queued again.
+  std::span<const std::uint8_t> contents(const DequeuedBuffer& buffer) const;
+  // Gives the buffer to the driver again, and with it those that the driver would not take before. 0, or the error
+  // number, for this buffer.
+  int queue(std::uint32_t index);
+
+  // How many there are.
+  std::size_t count() const { return mapped_.size(); }
+
+ private:
+  struct Mapped {
+    void* address = nullptr;
+    std::size_t length = 0;
+  };
+
+  bool map(std::uint32_t index, DiagnosticErrorPtr* error);
+  v4l2_buffer bufferOf(std::uint32_t index) const;
+
+  const std::shared_ptr<OpenedVideoNode> node_;
+  const std::uint32_t type_;
+  std::vector<Mapped> mapped_;          // by the buffer's index
+  std::vector<std::uint32_t> refused_;  // by the driver, which did not take them back
+  bool requested_ = false;
+  bool streaming_ = false;
+};
+
+}  // namespace quazor

@@ -1,0 +1,46 @@
+// CameraMetadata: makes the metadata dictionary of a frame.
+#pragma once
+
+#include "backends/linux/binding/binding.h"
+#include "backends/linux/capture/camera_pairing.h"
+#include "backends/linux/video/video_node.h"
+#include "contract/value.h"
+
+#include <cstdint>
+#include <memory>
+#include <optional>
+#include <span>
+#include <vector>
+
+namespace quazor {
+
+// The field's number; nothing when the buffer ends before it.
+std::optional<std::uint64_t> fieldIn(std::span<const std::uint8_t> buffer, const MetadataField& field);
+
+// Thread: one at a time.
+class CameraMetadata final {
+ public:
+  // Null, and an error, when the binding names a control that the camera does not have.
+  static std::unique_ptr<CameraMetadata> make(const MetadataBinding& binding, const OpenedVideoNode& camera,
+                                              DiagnosticErrorPtr* error);
+
+  // The controls that are read with every frame; one that cannot be read is missing.
+  Dictionary readControls(const OpenedVideoNode& camera) const;
+
+  // The frame's dictionary: constants, then fields, then controls. What ought to have come from a metadata buffer or a
+  // control and did not is left out, even where a constant has the same key; then `complete` is false.
+  Dictionary dictionaryOf(const CapturedFrame& frame, bool* complete) const;
+
+ private:
+  struct Control {
+    std::string key;
+    VideoControl control;
+  };
+
+  explicit CameraMetadata(const MetadataBinding& binding) : binding_(binding) {}
+
+  const MetadataBinding binding_;
+  std::vector<Control> controls_;
+};
+
+}  // namespace quazor

@@ -1,0 +1,225 @@
+#include "backends/linux/capture/linux_capture.h"
+
+#include "backends/linux/capture/linux_capture_for_tests.h"
+
+#include <cerrno>
+
+namespace quazor {
+namespace {
+
+using Fake = FakeCameras;
+
+TEST(LinuxCaptureTest, EveryPathLeadsToTheSameStreams) {
+  Fake fake;
+  const CaptureStreams ofGroup = *fake.group->streams(nullptr);
+  EXPECT_EQ(ofGroup, fake.backStreams());
+  EXPECT_EQ(fake.group->valueForProperty(capture_key::SynchronizationMaster, nullptr)->object(), fake.streams[0]);
+  EXPECT_EQ(*fake.device->streams(nullptr), fake.streams);
+}
+
+TEST(LinuxCaptureTest, ThereIsOneDefaultPlugInAndANewOneEachTimeElse) {
+  Fake fake;
+  EXPECT_EQ(fake.capture->defaultPlugIn(), fake.capture->defaultPlugIn());
+  EXPECT_NE(fake.capture->createPlugIn(), fake.capture->createPlugIn());
+  EXPECT_EQ(fake.capture->defaultPlugIn()->description(), "capture plug-in");
+  EXPECT_EQ(fake.device->description(), "capture device");
+  EXPECT_EQ(fake.wide().description(), "stream of BackFacingCamera");
+  EXPECT_EQ(fake.group->description(), "group BackFacingCamera BackFacingTelephotoCamera BackFacingSuperWideCamera");
+}
+
+TEST(LinuxCaptureTest, ABindingWithoutCamerasHasNoDevice) {
+  const auto capture = makeLinuxCapture(Binding());
+  EXPECT_EQ(outcome([&](auto* error) { return capture->createPlugIn()->device(error) != nullptr; }),
+            "2 The binding names no camera, so there is no capture device.");
+}
+
+TEST(LinuxCaptureTest, AGroupOfAnUnknownPortIsLeftOut) {
+  Binding binding = fakeBinding();
+  binding.groups.push_back({{"BackFacingCamera", "SideFacingCamera"}, "BackFacingCamera"});
+  const auto device = makeLinuxCapture(binding)->createPlugIn()->device(nullptr);
+  EXPECT_EQ(device->synchronizedStreamsGroups(nullptr)->size(), 1U);
+}
+
+TEST(LinuxCaptureTest, ControlOpensTheNodesAndGivingBackClosesThem) {
+  Fake fake;
+  EXPECT_TRUE(fake.kernel->isIdle());
+  EXPECT_EQ(fake.take(fake.streams), "done");
+  EXPECT_EQ(fake.take(0), "done") << "what one has, one can take";
+  EXPECT_EQ(fake.kernel->with(fake.nodes[3], [](auto& node) { return node.opened; }), 1);
+  EXPECT_TRUE(fake.device->relinquishControlOfStreams(fake.streams, nullptr));
+  EXPECT_TRUE(fake.kernel->isIdle());
+}
+
+TEST(LinuxCaptureTest, ControlOfSeveralIsOfAllOrNone) {
+  Fake fake;
+  const auto other = fake.capture->createPlugIn()->device(nullptr);
+  ASSERT_TRUE(other->requestControlOfStreams({other->streams(nullptr)->at(2)}, nullptr));
+  EXPECT_EQ(fake.take(fake.backStreams()), "8 BackFacingSuperWideCamera is under control of another user.");
+  EXPECT_EQ(fake.kernel->with(fake.nodes[0], [](auto& node) { return node.opened; }), 0);
+  EXPECT_EQ(fake.start(0), "7 BackFacingCamera is not under control; request control of it first.");
+}
+
+TEST(LinuxCaptureTest, ACameraThatAnotherProcessUsesIsRefused) {
+  Fake fake;
+  const int other = fake.kernel->open(fake.nodes[0]);
+  ASSERT_EQ(fake.kernel->lock(other), 0);
+  EXPECT_EQ(fake.take(0), "8 " + fake.nodes[0] + " is in use by another process of this kind.");
+  fake.kernel->close(other);
+  EXPECT_EQ(fake.take(0), "done");
+}
+
+TEST(LinuxCaptureTest, WhatCannotBeOpenedOrSetIsToldAndLeftClosed) {
+  struct Row {
+    const char* name;
+    void (*break_)(Fake&);
+    const char* want;
+  };
+  const Row rows[] = {
+      {"locks do not work", [](Fake& fake) { fake.kernel->failNext(fake.nodes[3], 0, ENOLCK); },
+       "1 flock on NODE failed: No locks available (ENOLCK)"},
+      {"the projector cannot be put out",
+       [](Fake& fake) { fake.kernel->failNext(fake.nodes[3], VIDIOC_S_EXT_CTRLS, EIO); },
+       "1 VIDIOC_S_EXT_CTRLS of \"Strobe\" on NODE failed: Input/output error (EIO)"},
+      {"a control of the binding is not there",
+       [](Fake& fake) {
+         fake.binding.cameras[3].controls = {{"Timestamp Source", 1}};
+       },
+       "5 NODE has no control \"Timestamp Source\"."},
+      {"there is no such metadata node",
+       [](Fake& fake) {
+         fake.binding.cameras[3].metadata.node = VideoNodeMatch{"uvc", {}, {}};
+       },
+       "2 FrontFacingInfraredCamera: no metadata node is driver uvc; there are META (driver fake, card fake camera, "
+       "bus fake:3)."},
+  };
+  for (const Row& row : rows) {
+    Fake fake;
+    row.break_(fake);
+    fake.open();
+    std::string want = row.want;
+    if (const auto at = want.find("NODE"); at != std::string::npos) want.replace(at, 4, fake.nodes[3]);
+    if (const auto at = want.find("META"); at != std::string::npos) {
+      want.replace(at, 4, (fake.kernel->roots().dev / "video13").string());
+    }
+    EXPECT_EQ(fake.take(3), want) << row.name;
+    EXPECT_TRUE(fake.kernel->isIdle()) << row.name;
+  }
+}
+
+TEST(LinuxCaptureTest, TheBindingsControlsAreSetInOrderWhenControlIsTaken) {
+  Binding binding = fakeBinding();
+  binding.cameras[3].controls = {{"Power", 40}, {"Power", 41}};
+  Fake fake(binding);
+  ASSERT_EQ(fake.take(3), "done");
+  const std::vector<std::string> want{"Strobe = 0", "Power = 40", "Power = 41"};
+  EXPECT_EQ(fake.kernel->with(fake.nodes[3], [](auto& node) { return node.history; }), want);
+}
+
+TEST(LinuxCaptureTest, WhatIsNoStreamOfTheDeviceIsRefused) {
+  Fake fake;
+  const auto other = fake.capture->createPlugIn()->device(nullptr);
+  const CaptureStreams foreign{other->streams(nullptr)->at(0)};
+  EXPECT_EQ(fake.take(foreign), "6 stream of BackFacingCamera is no stream of this device.");
+  EXPECT_EQ(fake.take(CaptureStreams{nullptr}), "6 (null) is no stream of this device.");
+  EXPECT_EQ(outcome([&](auto* error) { return fake.device->relinquishControlOfStreams(foreign, error); }),
+            "6 stream of BackFacingCamera is no stream of this device.");
+}
+
+TEST(LinuxCaptureTest, OnlyWhatIsHeldAndStoppedIsGivenBack) {
+  Fake fake;
+  const CaptureStreams wide{fake.streams[0]};
+  const auto giveBack = [&] {
+    return outcome([&](auto* error) { return fake.device->relinquishControlOfStreams(wide, error); });
+  };
+  EXPECT_EQ(giveBack(), "7 BackFacingCamera is not under control; request control of it first.");
+  fake.prepare(0);
+  ASSERT_EQ(fake.start(0), "done");
+  EXPECT_EQ(giveBack(), "7 BackFacingCamera runs; stop it before giving it back.");
+  ASSERT_EQ(fake.stop(0), "done");
+  EXPECT_EQ(giveBack(), "done");
+}
+
+TEST(LinuxCaptureTest, InvalidatingStopsAndFreesAllAndRefusesEverythingAfter) {
+  Fake fake;
+  fake.prepare(0);
+  fake.prepare(3);
+  ASSERT_EQ(fake.set(fake.infrared(), capture_key::InfraredLightSourceConfiguration, Fake::light(2)), "done");
+  ASSERT_EQ(fake.start(3), "done");
+  EXPECT_EQ(fake.control(kStrobe), 1);
+  EXPECT_TRUE(fake.device->invalidate(nullptr));
+  EXPECT_EQ(fake.control(kStrobe), 0);
+  const std::string refused = "7 The capture device has been invalidated; ask for a new one.";
+  EXPECT_EQ(outcome([&](auto* error) { return fake.device->invalidate(error); }), refused);
+  EXPECT_EQ(outcome([&](auto* error) { return fake.device->streams(error); }), refused);
+  EXPECT_EQ(outcome([&](auto* error) { return fake.device->synchronizedStreamsGroups(error); }), refused);
+  EXPECT_EQ(outcome([&](auto* error) { return fake.group->streams(error); }), refused);
+  EXPECT_EQ(outcome([&](auto* error) { return fake.wide().valueForProperty(capture_key::PortType, error); }), refused);
+  EXPECT_EQ(fake.start(0), refused);
+  EXPECT_EQ(fake.stop(0), refused);
+  EXPECT_EQ(fake.take(0), refused);
+  EXPECT_EQ(fake.set(fake.wide(), capture_key::FormatIndex, 1), refused);
+  const auto next = fake.capture->defaultPlugIn()->device(nullptr);
+  EXPECT_TRUE(next->requestControlOfStreams(*next->streams(nullptr), nullptr));
+  next->invalidate(nullptr);
+  fake.letGo();
+  EXPECT_TRUE(fake.kernel->isIdle());
+}
+
+TEST(LinuxCaptureTest, InvalidatingTellsThatAStreamCouldNotBeStopped) {
+  Fake fake;
+  fake.prepare(0);
+  ASSERT_EQ(fake.start(0), "done");
+  fake.kernel->failNext(fake.nodes[0], VIDIOC_STREAMOFF, EIO);
+  EXPECT_EQ(outcome([&](auto* error) { return fake.device->invalidate(error); }),
+            "1 VIDIOC_STREAMOFF on " + fake.nodes[0] + " failed: Input/output error (EIO)");
+}
+
+TEST(LinuxCaptureTest, TheLastReferenceStopsAndFreesAll) {
+  Fake fake;
+  fake.prepare(0);
+  fake.prepare(3);
+  ASSERT_EQ(fake.set(fake.infrared(), capture_key::InfraredLightSourceConfiguration, Fake::light(2)), "done");
+  ASSERT_EQ(fake.start(0), "done");
+  ASSERT_EQ(fake.start(3), "done");
+  fake.letGo();
+  EXPECT_TRUE(fake.kernel->isIdle());
+  EXPECT_EQ(fake.control(kStrobe), 0);
+}
+
+TEST(LinuxCaptureTest, AHandlerThatOwnsADeviceMayGoInEveryWay) {
+  const struct {
+    const char* name;
+    void (*drop)(Fake&);
+  } rows[] = {
+      {"replaced",
+       [](Fake& fake) { fake.set(fake.wide(), capture_key::VideoOutputHandlers, Fake::output(Dictionary{})); }},
+      {"given back", [](Fake& fake) { fake.device->relinquishControlOfStreams({fake.streams[0]}, nullptr); }},
+      {"invalidated", [](Fake& fake) { fake.device->invalidate(nullptr); }},
+      {"invalidated while it streams",
+       [](Fake& fake) {
+         EXPECT_EQ(fake.start(0), "done");
+         fake.device->invalidate(nullptr);
+       }},
+      {"with the last reference", [](Fake& fake) { fake.letGo(); }},
+  };
+  for (const auto& row : rows) {
+    Fake fake;
+    fake.prepare(0);
+    std::shared_ptr<CaptureDevice> owned = fake.capture->createPlugIn()->device(nullptr);
+    const std::weak_ptr<CaptureDevice> watched = owned;
+    fake.handle(0, [owned = std::move(owned)](PixelBuffer&, MediaTime) {});
+    row.drop(fake);
+    EXPECT_TRUE(watched.expired()) << row.name;
+  }
+}
+
+TEST(LinuxCaptureTest, ADeviceHasTwoProperties) {
+  Fake fake;
+  EXPECT_EQ(outcome([&](auto* error) { return fake.device->valueForProperty("Depth", error); }),
+            "10 The capture device has no property Depth of that use.");
+  EXPECT_EQ(fake.set(*fake.device, capture_key::MulticamSessionStatus, 1),
+            "10 The capture device has no property MulticamSessionStatus of that use.");
+}
+
+}  // namespace
+}  // namespace quazor

@@ -1,0 +1,332 @@
+#include "backends/linux/capture/linux_stream.h"
+
+#include "backends/linux/capture/linux_capture_for_tests.h"
+
+#include <cerrno>
+
+namespace quazor {
+namespace {
+
+using Fake = FakeCameras;
+
+std::optional<Value> get(const Fake& fake, std::string_view key, std::size_t index = 0) {
+  return fake.streams[index]->valueForProperty(key, nullptr);
+}
+
+TEST(LinuxStreamTest, AStreamThatWasNotTouchedHasTheUsualProperties) {
+  Fake fake;
+  EXPECT_EQ(get(fake, capture_key::PortType), Value("BackFacingCamera"));
+  EXPECT_EQ(get(fake, capture_key::FormatIndex), Value(0U));
+  EXPECT_EQ(get(fake, capture_key::MinimumFrameRate), std::nullopt);
+  EXPECT_EQ(get(fake, capture_key::AEEnabled), Value(true));
+  EXPECT_EQ(get(fake, capture_key::InfraredLightSourceConfiguration), std::nullopt) << "it has no projector";
+  EXPECT_EQ(get(fake, capture_key::InfraredLightSourceConfiguration, 3), Value(Fake::light(0)));
+  for (const std::string_view name :
+       {"I2CErrorCount", "MIPIErrorCount", "LPDPErrorCount", "UARTErrorCount", "SIFErrorCount", "ProjectorErrorCount",
+        "SequenceGapCount", "BufferErrorCount", "StreamErrorCount", "DisconnectCount", "MetadataErrorCount"}) {
+    EXPECT_EQ(fake.counter(0, name), 0) << name;
+  }
+  EXPECT_EQ(outcome([&](auto* error) { return fake.wide().valueForProperty("Depth", error); }),
+            "10 BackFacingCamera has no property Depth of that use.");
+}
+
+TEST(LinuxStreamTest, PropertiesReadBackAsTheyWereSetAndAreNewForTheNextUser) {
+  Fake fake;
+  ASSERT_EQ(fake.take(3), "done");
+  const Dictionary slave{{text(capture_key::StreamingOutputsEnabled), true},
+                         {text(capture_key::FrameSkippingEnabled), false},
+                         {text(capture_key::TimeMachineEnabled), false},
+                         {text(capture_key::MasterToSlaveFrameRateRatio), 1}};
+  const Dictionary raw{{text(capture_key::AttachRaw), true}};
+  const Dictionary handlers{
+      {text(capture_key::EventHandler), std::make_shared<EventHandler>([](std::int32_t, MediaTime, const Value*) {})}};
+  const std::pair<std::string_view, Value> settings[] = {
+      {capture_key::FormatIndex, 1},
+      {capture_key::MinimumFrameRate, 29.97},
+      {capture_key::MaximumFrameRate, 30U},
+      {capture_key::MultipleOutputSupportEnabled, true},
+      {capture_key::SynchronizedStreamsSlaveConfiguration, slave},
+      {capture_key::AEEnabled, false},
+      {capture_key::InfraredLightSourceConfiguration, Fake::light(2, 1, 0)},
+      {capture_key::VideoOutputConfigurations, Fake::output(raw)},
+      {capture_key::VideoOutputsEnabled, Fake::output(true)},
+      {capture_key::VideoOutputHandlers, Fake::output(handlers)},
+  };
+  for (const auto& [key, value] : settings) {
+    EXPECT_EQ(fake.set(fake.infrared(), key, value), "done") << key;
+    EXPECT_EQ(get(fake, key, 3), value) << key;
+  }
+  ASSERT_TRUE(fake.device->relinquishControlOfStreams({fake.streams[3]}, nullptr));
+  EXPECT_EQ(get(fake, capture_key::VideoOutputHandlers, 3), Value(Dictionary{}));
+  ASSERT_EQ(fake.take(3), "done");
+  EXPECT_EQ(get(fake, capture_key::MultipleOutputSupportEnabled, 3), Value(false));
+}
+
+TEST(LinuxStreamTest, ValuesThatDoNotFitAreRefusedAndChangeNothing) {
+  const Value handler = std::make_shared<PixelBufferHandler>([](PixelBuffer&, MediaTime) {});
+  const auto output = [](Value value) { return Value(Fake::output(std::move(value))); };
+  const auto in = [](std::string_view key, Value value) { return Value(Dictionary{{text(key), std::move(value)}}); };
+  const auto slave = [](bool outputs, bool skipping, Value ratio) {
+    return Value(Dictionary{{text(capture_key::StreamingOutputsEnabled), outputs},
+                            {text(capture_key::FrameSkippingEnabled), skipping},
+                            {text(capture_key::TimeMachineEnabled), false},
+                            {text(capture_key::MasterToSlaveFrameRateRatio), std::move(ratio)}});
+  };
+  const struct {
+    std::string_view key;
+    Value value;
+    const char* want;
+  } rows[] = {
+      {capture_key::FormatIndex, "1", "6 P: FormatIndex takes a whole number from 0, not 1."},
+      {capture_key::FormatIndex, -1, "6 P: FormatIndex takes a whole number from 0, not -1."},
+      {capture_key::FormatIndex, true, "6 P: FormatIndex takes a whole number from 0, not 1."},
+      {capture_key::FormatIndex, 0.5, "6 P: FormatIndex takes a whole number from 0, not 0.5."},
+      {capture_key::FormatIndex, 4294967296U, "6 P: FormatIndex takes a whole number from 0, not 4294967296."},
+      {capture_key::MinimumFrameRate, 0.009, "6 P: MinimumFrameRate takes a number from 0.01 to 10000, not 0.009."},
+      {capture_key::MaximumFrameRate, 10001, "6 P: MaximumFrameRate takes a number from 0.01 to 10000, not 10001."},
+      {capture_key::MaximumFrameRate, true, "6 P: MaximumFrameRate takes a number from 0.01 to 10000, not 1."},
+      {capture_key::MultipleOutputSupportEnabled, 1, "6 P: MultipleOutputSupportEnabled takes a boolean, not 1."},
+      {capture_key::AEEnabled, 0, "6 P: AEEnabled takes a boolean, not 0."},
+      {capture_key::PortType, "Other", "10 P has no property PortType of that use."},
+      {capture_key::InfraredLightSourceConfiguration, 2,
+       "6 P: InfraredLightSourceConfiguration takes a dictionary, not 2."},
+      {capture_key::InfraredLightSourceConfiguration, in(capture_key::Mode, 2),
+       "6 P: InfraredLightSourceConfiguration needs the entry StructuredLightPattern."},
+      {capture_key::InfraredLightSourceConfiguration, in("Colour", 2),
+       "6 P: InfraredLightSourceConfiguration has no entry Colour."},
+      {capture_key::InfraredLightSourceConfiguration, Fake::light(-1),
+       "6 P: Mode takes a whole number from 0, not -1."},
+      {capture_key::InfraredLightSourceConfiguration, Fake::light(1, 0, 101),
+       "6 P: the control \"Power\" takes 0 to 100, not 101."},
+      {capture_key::VideoOutputConfigurations, in("SecondaryScaler", 1),
+       "6 P: VideoOutputConfigurations has no entry SecondaryScaler."},
+      {capture_key::VideoOutputConfigurations, output(1), "6 P: PrimaryScaler takes a dictionary, not 1."},
+      {capture_key::VideoOutputConfigurations, output(in(capture_key::AttachRaw, 1)),
+       "6 P: AttachRaw takes a boolean, not 1."},
+      {capture_key::VideoOutputsEnabled, output(1), "6 P: PrimaryScaler takes a boolean, not 1."},
+      {capture_key::VideoOutputHandlers, output(1), "6 P: PrimaryScaler takes a dictionary, not 1."},
+      {capture_key::VideoOutputHandlers, output(in(capture_key::EventHandler, handler)),
+       "6 P: EventHandler takes a handler of its kind, not frame handler."},
+      {capture_key::VideoOutputHandlers, output(in(capture_key::PixelBufferHandler, 1)),
+       "6 P: PixelBufferHandler takes a handler of its kind, not 1."},
+      {capture_key::SynchronizedStreamsSlaveConfiguration, slave(true, false, 2),
+       "5 P: MasterToSlaveFrameRateRatio can only be 1 here, not 2."},
+      {capture_key::SynchronizedStreamsSlaveConfiguration, slave(true, true, 1),
+       "5 P: FrameSkippingEnabled can only be 0 here, not 1."},
+      {capture_key::SynchronizedStreamsSlaveConfiguration, slave(false, false, 1),
+       "5 P: StreamingOutputsEnabled can only be 1 here, not 0."},
+      {capture_key::SynchronizedStreamsSlaveConfiguration, slave(true, false, "1"),
+       "6 P: MasterToSlaveFrameRateRatio takes a whole number from 0, not 1."},
+  };
+  Fake fake;
+  ASSERT_EQ(fake.take(3), "done");
+  for (const auto& row : rows) {
+    std::string want = row.want;
+    want.replace(want.find(' ') + 1, 1, "FrontFacingInfraredCamera");
+    if (row.value.dictionary() != nullptr && want.find("of its kind, not frame") != std::string::npos) {
+      want = want.substr(0, want.find("not frame")) + "not " + defaultText(handler) + ".";
+    }
+    const std::optional<Value> before = get(fake, row.key, 3);
+    EXPECT_EQ(fake.set(fake.infrared(), row.key, row.value), want);
+    EXPECT_EQ(get(fake, row.key, 3), before) << want;
+  }
+}
+
+TEST(LinuxStreamTest, SettingNeedsControlAndAStoppedStream) {
+  Fake fake;
+  EXPECT_EQ(fake.set(fake.wide(), capture_key::FormatIndex, 0),
+            "7 BackFacingCamera is not under control; request control of it first.");
+  fake.prepare(0);
+  EXPECT_EQ(fake.stop(0), "7 BackFacingCamera is not running.");
+  ASSERT_EQ(fake.start(0), "done");
+  EXPECT_EQ(fake.set(fake.wide(), capture_key::FormatIndex, 0),
+            "7 BackFacingCamera: FormatIndex cannot be set while the stream runs.");
+  EXPECT_EQ(fake.start(0), "7 BackFacingCamera is running already.");
+}
+
+TEST(LinuxStreamTest, AFormatThatIsNotThereOrHasAnotherSizeIsRefused) {
+  Binding binding = fakeBinding();
+  binding.cameras[1].width = 800;
+  Fake fake(binding);
+  ASSERT_EQ(fake.take(CaptureStreams{fake.streams[0], fake.streams[1]}), "done");
+  EXPECT_EQ(fake.set(fake.wide(), capture_key::FormatIndex, 2), "5 " + fake.nodes[0] + " has no format of index 2.");
+  EXPECT_EQ(
+      fake.set(fake.stream(1), capture_key::FormatIndex, 1),
+      "5 " + fake.nodes[1] + ": format 1 (GREY) of 800 x 360 is not to be had; the driver offers GREY of 640 x 360.");
+}
+
+TEST(LinuxStreamTest, ARateThatTheDriverSilentlyChangesIsRefusedWithTheDriversOwn) {
+  Binding binding = fakeBinding();
+  binding.cameras[0].height = 480;
+  Fake fake(binding);
+  ASSERT_EQ(fake.take(0), "done");
+  ASSERT_EQ(fake.set(fake.wide(), capture_key::FormatIndex, 0), "done");
+  ASSERT_EQ(fake.set(fake.wide(), capture_key::MinimumFrameRate, 30), "done");
+  EXPECT_EQ(fake.set(fake.wide(), capture_key::MaximumFrameRate, 30),
+            "5 BackFacingCamera: " + fake.nodes[0] +
+                " does not take 1/30 s between frames in this format; its driver gives 1/25 s instead, which is 25 "
+                "frames per second.");
+  EXPECT_EQ(get(fake, capture_key::MaximumFrameRate), std::nullopt);
+}
+
+TEST(LinuxStreamTest, RatesThatAreNearEnoughOrWithinTheRangeAreTaken) {
+  const struct {
+    const char* name;
+    double lowest;
+    double highest;
+    bool fits;
+  } rows[] = {
+      {"exactly", 30, 30, true},
+      {"29.97 counts as 30", 29.97, 29.97, true},
+      {"within the tolerance above", 30.06, 30.06, true},
+      {"beyond the tolerance", 30.1, 30.1, false},
+      {"the driver's is between the two", 26, 35, true},
+      {"the driver's is beyond both", 26, 29, false},
+      {"a range that has the wanted highest", 10, 40, true},
+  };
+  for (const auto& row : rows) {
+    Fake fake;
+    ASSERT_EQ(fake.take(0), "done");
+    ASSERT_EQ(fake.set(fake.wide(), capture_key::FormatIndex, 0), "done");
+    ASSERT_EQ(fake.set(fake.wide(), capture_key::MinimumFrameRate, row.lowest), "done");
+    EXPECT_EQ(fake.set(fake.wide(), capture_key::MaximumFrameRate, row.highest) == "done", row.fits) << row.name;
+  }
+}
+
+TEST(LinuxStreamTest, RatesAreCheckedAtTheStartAnew) {
+  Binding binding = fakeBinding();
+  Fake fake(binding);
+  fake.prepare(0);
+  EXPECT_EQ(fake.set(fake.wide(), capture_key::MinimumFrameRate, 40), "done");
+  EXPECT_EQ(fake.start(0), "7 BackFacingCamera: MinimumFrameRate 40 is above MaximumFrameRate 30.");
+  EXPECT_EQ(fake.set(fake.wide(), capture_key::MinimumFrameRate, 30), "done");
+  fake.kernel->with(fake.nodes[0], [](FakeNode& node) { return node.formats[0].sizes[0].intervals = {{1, 5}}; });
+  EXPECT_EQ(fake.start(0).substr(0, 2), "5 ");
+  EXPECT_EQ(fake.kernel->with(fake.nodes[0], [](auto& node) { return node.buffers; }), 0U);
+}
+
+TEST(LinuxStreamTest, OneRateAloneIsABoundAndNoneLeavesTheDriversOwn) {
+  const auto rateAfter = [](std::string_view key, double rate) {
+    Fake fake;
+    EXPECT_EQ(fake.take(0), "done");
+    EXPECT_EQ(fake.set(fake.wide(), key, rate), "done");
+    EXPECT_EQ(fake.start(0), "done");
+    return fake.kernel->with(fake.nodes[0], [](auto& node) { return node.interval.denominator; });
+  };
+  EXPECT_EQ(rateAfter(capture_key::MinimumFrameRate, 30), 30U);
+  EXPECT_EQ(rateAfter(capture_key::MaximumFrameRate, 40), 40U);
+  Fake fake;
+  ASSERT_EQ(fake.take(0), "done");
+  fake.kernel->failNext(fake.nodes[0], VIDIOC_G_PARM, ENOTTY);
+  EXPECT_EQ(fake.start(0), "done");
+  EXPECT_EQ(fake.kernel->with(fake.nodes[0], [](auto& node) { return node.interval.denominator; }), 5U);
+}
+
+TEST(LinuxStreamTest, ADriverThatSetsNoRatesIsRefused) {
+  Fake fake;
+  ASSERT_EQ(fake.take(0), "done");
+  ASSERT_EQ(fake.set(fake.wide(), capture_key::MinimumFrameRate, 30), "done");
+  fake.kernel->failNext(fake.nodes[0], VIDIOC_S_PARM, ENOTTY);
+  EXPECT_EQ(fake.set(fake.wide(), capture_key::MaximumFrameRate, 30),
+            "1 VIDIOC_S_PARM on " + fake.nodes[0] + " failed: Inappropriate ioctl for device (ENOTTY)");
+}
+
+TEST(LinuxStreamTest, TheIntervalOfARateIsTheShortestFraction) {
+  EXPECT_EQ(intervalFor(30), (FrameInterval{1, 30}));
+  EXPECT_EQ(intervalFor(29.97), (FrameInterval{1000, 29970}));
+  EXPECT_EQ(intervalFor(0.5), (FrameInterval{1000, 500}));
+  EXPECT_EQ(intervalFor(0.01), (FrameInterval{1000, 10}));
+}
+
+TEST(LinuxStreamTest, AutomaticExposureIsTheControlOfThatName) {
+  Fake fake;
+  const auto exposure = [&](std::int64_t usual) {
+    fake.kernel->with(fake.nodes[0], [usual](FakeNode& node) {
+      node.controls = {{V4L2_CID_EXPOSURE_AUTO, "Auto Exposure", 0, 3, usual, V4L2_CTRL_TYPE_MENU}};
+      return 0;
+    });
+    fake.device->relinquishControlOfStreams({fake.streams[0]}, nullptr);
+    EXPECT_EQ(fake.take(0), "done");
+  };
+  const auto value = [&] {
+    return fake.kernel->with(fake.nodes[0], [](auto& node) { return node.controls[0].value; });
+  };
+  exposure(V4L2_EXPOSURE_APERTURE_PRIORITY);
+  EXPECT_EQ(fake.set(fake.wide(), capture_key::AEEnabled, false), "done");
+  EXPECT_EQ(value(), V4L2_EXPOSURE_MANUAL);
+  EXPECT_EQ(fake.set(fake.wide(), capture_key::AEEnabled, true), "done");
+  EXPECT_EQ(value(), V4L2_EXPOSURE_APERTURE_PRIORITY);
+  exposure(V4L2_EXPOSURE_MANUAL);
+  EXPECT_EQ(fake.set(fake.wide(), capture_key::AEEnabled, true), "done");
+  EXPECT_EQ(value(), V4L2_EXPOSURE_AUTO);
+  fake.kernel->failNext(fake.nodes[0], VIDIOC_S_EXT_CTRLS, EBUSY);
+  EXPECT_EQ(
+      fake.set(fake.wide(), capture_key::AEEnabled, false),
+      "8 VIDIOC_S_EXT_CTRLS of \"Auto Exposure\" on " + fake.nodes[0] + " failed: Device or resource busy (EBUSY)");
+  EXPECT_EQ(get(fake, capture_key::AEEnabled), Value(true));
+}
+
+TEST(LinuxStreamTest, AutomaticExposureIsAsTheDriverHasItWhenControlIsTaken) {
+  const struct {
+    const char* name;
+    std::int64_t value;
+    int problem;
+    bool want;
+  } rows[] = {
+      {"automatic", V4L2_EXPOSURE_AUTO, 0, true},
+      {"in part automatic", V4L2_EXPOSURE_APERTURE_PRIORITY, 0, true},
+      {"as an earlier user left it", V4L2_EXPOSURE_MANUAL, 0, false},
+      {"not to be read", V4L2_EXPOSURE_AUTO, EIO, false},
+  };
+  for (const auto& row : rows) {
+    Fake fake;
+    fake.kernel->with(fake.nodes[0], [&row](FakeNode& node) {
+      node.controls = {{V4L2_CID_EXPOSURE_AUTO, "Auto Exposure", 0, 3, row.value, V4L2_CTRL_TYPE_MENU}};
+      return 0;
+    });
+    if (row.problem != 0) fake.kernel->failNext(fake.nodes[0], VIDIOC_G_EXT_CTRLS, row.problem);
+    ASSERT_EQ(fake.take(0), "done");
+    EXPECT_EQ(get(fake, capture_key::AEEnabled), Value(row.want)) << row.name;
+  }
+}
+
+TEST(LinuxStreamTest, ACameraWithoutAutomaticExposureCanOnlyBeWithout) {
+  Fake fake;
+  ASSERT_EQ(fake.take(0), "done");
+  EXPECT_EQ(get(fake, capture_key::AEEnabled), Value(false));
+  EXPECT_EQ(fake.set(fake.wide(), capture_key::AEEnabled, false), "done");
+  EXPECT_EQ(fake.set(fake.wide(), capture_key::AEEnabled, true),
+            "5 BackFacingCamera: " + fake.nodes[0] + " has no automatic exposure.");
+}
+
+TEST(LinuxStreamTest, ACameraWithoutAProjectorHasNoLightSource) {
+  Fake fake;
+  ASSERT_EQ(fake.take(0), "done");
+  EXPECT_EQ(fake.set(fake.wide(), capture_key::InfraredLightSourceConfiguration, Fake::light(2)),
+            "5 BackFacingCamera has no projector, so no InfraredLightSourceConfiguration.");
+}
+
+TEST(LinuxStreamTest, AProjectorsSetOfBitsTakesEveryNumber) {
+  Fake fake;
+  fake.kernel->with(fake.nodes[3], [](FakeNode& node) {
+    FakeControl& power = *std::ranges::find(node.controls, kPower, &FakeControl::id);
+    power.type = V4L2_CTRL_TYPE_BITMASK;
+    return power.highest = 0;
+  });
+  ASSERT_EQ(fake.take(3), "done");
+  EXPECT_EQ(fake.set(fake.infrared(), capture_key::InfraredLightSourceConfiguration, Fake::light(2, 0, 5)), "done");
+  EXPECT_EQ(fake.start(3), "done");
+  EXPECT_EQ(fake.control(kPower), 5);
+}
+
+TEST(LinuxStreamTest, AProjectorsControlMustBeThere) {
+  Binding binding = fakeBinding();
+  binding.cameras[3].projector->modeControl = "Flash Mode";
+  Fake fake(binding);
+  ASSERT_EQ(fake.take(3), "done");
+  EXPECT_EQ(fake.set(fake.infrared(), capture_key::InfraredLightSourceConfiguration, Fake::light(2)),
+            "5 " + fake.nodes[3] + " has no control \"Flash Mode\".");
+}
+
+}  // namespace
+}  // namespace quazor

@@ -1,0 +1,204 @@
+#include "backends/linux/probe/probe_cameras.h"
+
+#include "backends/linux/system/linux_error.h"
+#include "contract/message_format.h"
+#include "platform/capture_keys.h"
+
+#include <algorithm>
+#include <array>
+#include <cmath>
+#include <optional>
+#include <utility>
+
+namespace quazor {
+namespace {
+
+using Json = nlohmann::ordered_json;
+
+constexpr std::array kPorts{port_type::BackFacingCamera, port_type::BackFacingTelephotoCamera,
+                            port_type::BackFacingSuperWideCamera, port_type::FrontFacingCamera,
+                            port_type::FrontFacingInfraredCamera};
+constexpr double kUsualRate = 30;
+// What is chosen of a camera that offers any size, and the most that is chosen of others.
+constexpr std::uint32_t kUsualWidth = 640;
+constexpr std::uint32_t kUsualHeight = 480;
+constexpr std::uint64_t kMostPixels = std::uint64_t{1920} * 1080;
+constexpr std::uint32_t kLargestSide = 65536;  // that a binding can name
+
+bool reachesUsualRate(const FrameSize& size) {
+  bool below = false;
+  bool above = false;
+  for (const FrameInterval& interval : size.intervals) {
+    const double rate = interval.framesPerSecond();
+    if (std::abs(rate - kUsualRate) < 0.01) return true;
+    (rate < kUsualRate ? below : above) = true;
+  }
+  return size.anyIntervalBetween && below && above;
+}
+
+std::string rateText(const FrameInterval& interval) {
+  return formatMessage("%@", std::round(interval.framesPerSecond() * 100) / 100);
+}
+
+std::string ratesText(const FrameSize& size) {
+  std::string text;
+  for (const FrameInterval& interval : size.intervals) {
+    if (!text.empty()) text += size.anyIntervalBetween ? " to " : ", ";
+    text += rateText(interval);
+  }
+  return text.empty() ? "rates that the driver does not tell" : text + " frames a second";
+}
+
+std::string sizeText(const FrameSize& size) {
+  std::string text = formatMessage("%@x%@", size.width, size.height);
+  if (size.highestWidth > size.width || size.highestHeight > size.height) {
+    text += formatMessage(" to %@x%@", size.highestWidth, size.highestHeight);
+  }
+  return text + " at " + ratesText(size);
+}
+
+std::vector<std::string> sizeTexts(const VideoFormat& format) {
+  std::vector<std::string> texts;
+  for (const FrameSize& size : format.sizes) texts.push_back(sizeText(size));
+  return texts;
+}
+
+// Formats that follow each other and have the same sizes are told together.
+void tellFormats(const std::vector<VideoFormat>& formats, std::vector<std::string>* lines) {
+  for (std::size_t begin = 0; begin < formats.size();) {
+    const std::vector<std::string> sizes = sizeTexts(formats[begin]);
+    std::size_t end = begin;
+    std::string codes;
+    for (; end < formats.size() && sizeTexts(formats[end]) == sizes; ++end) codes += " " + formats[end].code;
+    lines->push_back(
+        end - begin == 1
+            ? formatMessage("    format %@:%@ (%@)", formats[begin].index, codes, formats[begin].text)
+            : formatMessage("    formats %@ to %@:%@", formats[begin].index, formats[end - 1].index, codes));
+    for (const std::string& size : sizes) lines->push_back("      " + size);
+    begin = end;
+  }
+}
+
+void tellControls(const std::vector<VideoControl>& controls, std::vector<std::string>* lines) {
+  std::string names;
+  for (const VideoControl& control : controls) names += (names.empty() ? "" : ", ") + control.name;
+  if (!names.empty()) lines->push_back("    controls: " + names);
+}
+
+// The size that a binding begins with: the largest one at the usual rate, or the largest one.
+std::optional<std::pair<std::uint32_t, std::uint32_t>> chosenSize(const VideoNodeDetails& details) {
+  std::optional<std::pair<std::uint32_t, std::uint32_t>> chosen;
+  std::pair<bool, std::uint64_t> best;
+  if (details.formats.empty()) return chosen;
+  for (const FrameSize& size : details.formats.front().sizes) {
+    const std::uint32_t width = std::clamp(kUsualWidth, size.width, std::max(size.width, size.highestWidth));
+    const std::uint32_t height = std::clamp(kUsualHeight, size.height, std::max(size.height, size.highestHeight));
+    if (std::min(width, height) == 0 || std::max(width, height) > kLargestSide) continue;
+    const std::uint64_t pixels = std::uint64_t{width} * height;
+    const std::pair<bool, std::uint64_t> worth{reachesUsualRate(size), pixels <= kMostPixels ? pixels : 1};
+    if (chosen && worth <= best) continue;
+    best = worth;
+    chosen = {width, height};
+  }
+  return chosen;
+}
+
+bool isSameMatch(const VideoNode& a, const VideoNode& b) {
+  return a.driver == b.driver && a.card == b.card && a.busInfo == b.busInfo;
+}
+
+class CameraProbe {
+ public:
+  CameraProbe(const std::shared_ptr<VideoKernel>& kernel, const DeviceRoots& roots, std::vector<std::string>* lines)
+      : kernel_(kernel), nodes_(videoNodes(kernel, roots)), lines_(lines) {}
+
+  Json run() {
+    if (nodes_.empty()) {
+      tell("  none: no driver offers a video node (/dev/video*). Is the camera connected, and its driver loaded?");
+    }
+    for (const VideoNode& node : nodes_) {
+      tell("  " + textOf(node));
+      if (node.problem != nullptr) {
+        tellProblem(*node.problem);
+      } else if (node.kind == VideoNodeKind::kCamera) {
+        probeCamera(node);
+      } else if (node.kind == VideoNodeKind::kMetadata) {
+        tellMetadata(node);
+      } else {
+        tell("    does not fit: it captures no video to buffers that a program maps, or in several planes");
+      }
+    }
+    return std::move(cameras_);
+  }
+
+ private:
+  void tell(std::string line) const { lines_->push_back(std::move(line)); }
+
+  void tellProblem(const DiagnosticError& problem) const {
+    tell("    does not fit: " + problem.localizedDescription());
+    if (problem.code() == static_cast<std::int64_t>(LinuxErrorCode::kNoAccess)) {
+      tell("    Its group may use it, usually \"video\"; docs/linux.md has a udev rule that gives it to another.");
+    }
+  }
+
+  void probeCamera(const VideoNode& node) {
+    DiagnosticErrorPtr error;
+    const std::optional<VideoNodeDetails> details = detailsOf(kernel_, node, &error);
+    if (!details) return tellProblem(*error);
+    const auto isLikeIt = [&node](const VideoNode& other) {
+      return other.kind == VideoNodeKind::kCamera && other.problem == nullptr && isSameMatch(other, node);
+    };
+    const auto size = chosenSize(*details);
+    if (!size) {
+      tell("    does not fit: its driver tells no format, or no size of the first one that a camera can have");
+    } else if (node.driver.empty() && node.card.empty() && node.busInfo.empty()) {
+      tell("    does not fit: its driver tells nothing of it by which a binding could name it");
+    } else if (std::ranges::count_if(nodes_, isLikeIt) > 1) {
+      tell("    does not fit: another camera has the same driver, card and bus, so a binding cannot tell them apart");
+    } else if (cameras_.size() == kPorts.size()) {
+      tell("    fits, but all ports are taken; put it in place of another one in the binding below");
+    } else {
+      bind(node, *size);
+    }
+    if (size && std::ranges::none_of(details->formats.front().sizes, reachesUsualRate)) {
+      tell("    Its first format has no size at 30 frames a second, the rate of the diagnostics of cameras.");
+    }
+    tellFormats(details->formats, lines_);
+    tellControls(details->controls, lines_);
+  }
+
+  void bind(const VideoNode& node, std::pair<std::uint32_t, std::uint32_t> size) {
+    const std::string port(kPorts.at(cameras_.size()));
+    tell("    fits: " + port + " in the binding below; which one it really is, you must say");
+    Json match = Json::object();
+    if (!node.driver.empty()) match["driver"] = node.driver;
+    if (!node.card.empty()) match["card"] = node.card;
+    if (!node.busInfo.empty()) match["busInfo"] = node.busInfo;
+    cameras_[port] = {{"node", std::move(match)}, {"size", {{"width", size.first}, {"height", size.second}}}};
+  }
+
+  void tellMetadata(const VideoNode& node) const {
+    for (const VideoNode& camera : nodes_) {
+      if (camera.kind != VideoNodeKind::kCamera || camera.busInfo != node.busInfo || camera.problem != nullptr)
+        continue;
+      return tell("    metadata of " + camera.path.string() +
+                  ", which is on the same bus; a binding's \"metadata\" "
+                  "may name it, with the fields of its buffers");
+    }
+    tell("    metadata of no camera that is on the same bus");
+  }
+
+  const std::shared_ptr<VideoKernel>& kernel_;
+  const std::vector<VideoNode> nodes_;
+  std::vector<std::string>* const lines_;
+  Json cameras_ = Json::object();
+};
+
+}  // namespace
+
+Json probeCameras(const std::shared_ptr<VideoKernel>& kernel, const DeviceRoots& roots,
+                  std::vector<std::string>* lines) {
+  return CameraProbe(kernel, roots, lines).run();
+}
+
+}  // namespace quazor

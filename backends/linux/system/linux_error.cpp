@@ -1,0 +1,42 @@
+#include "backends/linux/system/linux_error.h"
+
+#include <cerrno>
+#include <cstring>
+#include <utility>
+
+namespace quazor {
+
+namespace {
+
+LinuxErrorCode codeOf(int number) {
+  switch (number) {
+    case EACCES:
+    case EPERM: return LinuxErrorCode::kNoAccess;
+    case EBUSY: return LinuxErrorCode::kBusy;
+    case ENODEV:
+    case ENXIO: return LinuxErrorCode::kDeviceGone;
+    default: return LinuxErrorCode::kSystemCall;
+  }
+}
+
+}  // namespace
+
+void failLinux(DiagnosticErrorPtr* error, LinuxErrorCode code, std::string message) {
+  if (error != nullptr)
+    *error = errorWithMessage(LinuxErrorDomain, static_cast<std::int64_t>(code), std::move(message), nullptr);
+}
+
+void failSystemCall(DiagnosticErrorPtr* error, std::string_view call, std::string_view object, int number) {
+  const char* const name = ::strerrorname_np(number);
+  std::string message(call);
+  message += " on ";
+  message += object;
+  message += " failed: ";
+  message += std::strerror(number);
+  message += " (";
+  message += name != nullptr ? name : std::to_string(number);
+  message += ")";
+  failLinux(error, codeOf(number), std::move(message));
+}
+
+}  // namespace quazor

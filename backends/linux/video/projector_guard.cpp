@@ -1,0 +1,125 @@
+#include "backends/linux/video/projector_guard.h"
+
+#include "backends/linux/system/file_descriptor.h"
+
+#include <fcntl.h>
+#include <linux/videodev2.h>
+#include <poll.h>
+#include <sys/ioctl.h>
+#include <sys/prctl.h>
+#include <sys/socket.h>
+#include <sys/syscall.h>
+#include <sys/wait.h>
+#include <unistd.h>
+
+#include <algorithm>
+#include <array>
+#include <cerrno>
+#include <csignal>
+#include <cstddef>
+#include <cstdint>
+#include <utility>
+
+namespace quazor {
+namespace {
+
+// Closes every descriptor but those.
+void closeAllBut(const GuardDescriptors& kept) {
+  std::array<int, 3> numbers{kept.connection, kept.guarded, kept.device};
+  std::ranges::sort(numbers);
+  unsigned int first = 0;
+  for (const int number : numbers) {
+    const auto one = static_cast<unsigned int>(number);
+    if (first < one) ::syscall(SYS_close_range, first, one - 1, 0U);
+    first = one + 1;
+  }
+  ::syscall(SYS_close_range, first, ~0U, 0U);
+}
+
+// In the new process; it is ready when it says so.
+[[noreturn]] void becomeGuard(const GuardDescriptors& descriptors, const std::vector<ControlValue>& values,
+                              ControlSetter set) {
+  ::setsid();
+  ::prctl(PR_SET_NAME, kProjectorGuardName);
+  closeAllBut(descriptors);
+  const char ready = 0;
+  ::send(descriptors.connection, &ready, 1, MSG_NOSIGNAL);
+  guardControlsUntilEnd(descriptors, values.data(), values.size(), set);
+  ::_exit(0);
+}
+
+class ProjectorGuard final : public ControlGuard {
+ public:
+  ProjectorGuard(pid_t process, FileDescriptor connection) : process_(process), connection_(std::move(connection)) {}
+  ~ProjectorGuard() override {
+    // A copy of this process may have the connection open too, so that closing it would not be noticed.
+    const char end = 0;
+    ::send(connection_.get(), &end, 1, MSG_NOSIGNAL);
+    while (::waitpid(process_, nullptr, 0) < 0 && errno == EINTR) continue;
+  }
+
+ private:
+  const pid_t process_;
+  const FileDescriptor connection_;
+};
+
+}  // namespace
+
+void setVideoControl(int descriptor, const ControlValue& value) {
+  v4l2_ext_control control{};
+  control.id = value.control;
+  if (value.is64Bit) {
+    control.value64 = value.value;
+  } else {
+    control.value = static_cast<std::int32_t>(value.value);
+  }
+  v4l2_ext_controls controls{};
+  controls.which = V4L2_CTRL_WHICH_CUR_VAL;
+  controls.count = 1;
+  controls.controls = &control;
+  while (::ioctl(descriptor, VIDIOC_S_EXT_CTRLS, &controls) < 0 && errno == EINTR) continue;
+}
+
+void guardControlsUntilEnd(const GuardDescriptors& descriptors, const ControlValue* values, std::size_t count,
+                           ControlSetter set) {
+  std::array<pollfd, 2> ends{{{descriptors.connection, POLLIN, 0}, {descriptors.guarded, POLLIN, 0}}};
+  while (::poll(ends.data(), ends.size(), -1) < 0 && errno == EINTR) continue;
+  for (std::size_t i = 0; i < count; ++i) set(descriptors.device, values[i]);
+}
+
+std::unique_ptr<ControlGuard> startProjectorGuard(const std::string& path, const std::vector<ControlValue>& values,
+                                                  ControlSetter set, int* number) {
+  // Opened anew: a copy of our descriptor would keep its buffers in use after we have closed it.
+  const FileDescriptor device(::open(path.c_str(), O_RDWR | O_NONBLOCK | O_CLOEXEC));
+  const FileDescriptor guarded(device ? static_cast<int>(::syscall(SYS_pidfd_open, ::getpid(), 0U)) : -1);
+  std::array<int, 2> ends{-1, -1};
+  if (!guarded || ::socketpair(AF_UNIX, SOCK_STREAM | SOCK_CLOEXEC, 0, ends.data()) != 0) {
+    *number = errno;
+    return nullptr;
+  }
+  FileDescriptor ours(ends[0]);
+  FileDescriptor theirs(ends[1]);
+
+  // The guard is born with all signals blocked: one that came before it could block them would end it.
+  sigset_t all;
+  sigset_t before;
+  sigfillset(&all);
+  ::pthread_sigmask(SIG_SETMASK, &all, &before);
+  const pid_t process = ::fork();
+  if (process == 0) becomeGuard({theirs.get(), guarded.get(), device.get()}, values, set);
+  *number = process < 0 ? errno : 0;
+  ::pthread_sigmask(SIG_SETMASK, &before, nullptr);
+  if (process < 0) return nullptr;
+
+  // Until the guard has closed what it inherited, it keeps our devices open.
+  theirs.reset();
+  char ready = 0;
+  ssize_t said = -1;
+  while ((said = ::read(ours.get(), &ready, 1)) < 0 && errno == EINTR) continue;
+  auto guard = std::make_unique<ProjectorGuard>(process, std::move(ours));
+  if (said == 1) return guard;
+  *number = ECHILD;  // it was ended before it was ready
+  return nullptr;
+}
+
+}  // namespace quazor

@@ -1,0 +1,103 @@
+#include "backends/simulated/calls/call_interceptor.h"
+
+#include "backends/simulated/calls/capture_error.h"
+#include "backends/simulated/scenario/report_operations.h"
+#include "backends/simulated/scenario/sensor_operations.h"
+
+#include <algorithm>
+
+namespace quazor {
+namespace {
+
+bool takes(const Fault& fault, const CallSite& site) {
+  return (fault.operation == "*" || fault.operation == site.operation) &&
+         (!fault.object || *fault.object == site.object) && (!fault.property || *fault.property == site.property);
+}
+
+// "CaptureStream.setValue of back-tele for FormatIndex"
+std::string nameOf(const CallSite& site) {
+  std::string name(site.operation);
+  if (!site.object.empty()) name.append(" of ").append(site.object);
+  if (!site.property.empty()) name.append(" for ").append(site.property);
+  return name;
+}
+
+DiagnosticErrorPtr injectedError(const Fault& fault, const CallSite& site) {
+  if (fault.error) return errorWithMessage(fault.error->domain, fault.error->code, fault.error->message, nullptr);
+  if (std::ranges::find(kReportOperations, site.operation) != kReportOperations.end()) {
+    return makeError(SimulatedReportErrorDomain, static_cast<std::int64_t>(ReportErrorCode::kInjected), "%@ failed.",
+                     nameOf(site));
+  }
+  if (std::ranges::find(kSensorOperations, site.operation, &SensorOperation::name) != kSensorOperations.end()) {
+    return makeError(SimulatedHidErrorDomain, static_cast<std::int64_t>(HidErrorCode::kInjected), "%@ failed.",
+                     nameOf(site));
+  }
+  return makeError(SimulatedCaptureErrorDomain, static_cast<std::int64_t>(CaptureErrorCode::kInjected), "%@ failed.",
+                   nameOf(site));
+}
+
+}  // namespace
+
+CallInterceptor::CallInterceptor(std::vector<Fault> faults, std::shared_ptr<Clock> clock, Hang hang)
+    : clock_(std::move(clock)), hang_(std::move(hang)) {
+  for (Fault& fault : faults) addFault(std::move(fault));
+}
+
+void CallInterceptor::addFault(Fault fault) {
+  const std::lock_guard lock(mutex_);
+  faults_.push_back({{std::move(fault), 0}, 0});
+}
+
+std::vector<FaultStatus> CallInterceptor::faultStatus() const {
+  const std::lock_guard lock(mutex_);
+  std::vector<FaultStatus> statuses;
+  for (const CountedFault& fault : faults_) statuses.push_back(fault.status);
+  return statuses;
+}
+
+void CallInterceptor::observe(Observer observer) {
+  auto replacement = observer ? std::make_shared<const Observer>(std::move(observer)) : nullptr;
+  const std::lock_guard lock(mutex_);
+  observer_.swap(replacement);
+}
+
+std::shared_ptr<const CallInterceptor::Observer> CallInterceptor::currentObserver() const {
+  const std::lock_guard lock(mutex_);
+  return observer_;
+}
+
+// The faults that act on this call: delays, and behind them at most one that ends it.
+std::vector<Fault> CallInterceptor::faultsOn(const CallSite& site) {
+  const std::lock_guard lock(mutex_);
+  std::vector<Fault> acting;
+  std::optional<Fault> ending;
+  for (CountedFault& fault : faults_) {
+    if (!takes(fault.status.fault, site)) continue;
+    ++fault.taken;
+    if (fault.status.fault.occurrence && *fault.status.fault.occurrence != fault.taken) continue;
+    const bool delays = fault.status.fault.action == FaultAction::kDelay;
+    if (!delays && ending) continue;
+    ++fault.status.fired;
+    if (delays) {
+      acting.push_back(fault.status.fault);
+    } else {
+      ending = fault.status.fault;
+    }
+  }
+  if (ending) acting.push_back(*std::move(ending));
+  return acting;
+}
+
+bool CallInterceptor::faultsLetPass(const CallSite& site, DiagnosticErrorPtr* error) {
+  for (const Fault& fault : faultsOn(site)) {
+    switch (fault.action) {
+      case FaultAction::kDelay: clock_->sleep(nanosecondsFromSeconds(fault.seconds)); break;
+      case FaultAction::kHang: hang_(nameOf(site) + " hangs"); return false;
+      case FaultAction::kNothing: return false;
+      case FaultAction::kFail: storeError(error, injectedError(fault, site)); return false;
+    }
+  }
+  return true;
+}
+
+}  // namespace quazor

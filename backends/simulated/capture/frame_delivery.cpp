@@ -1,0 +1,166 @@
+#include "backends/simulated/capture/frame_delivery.h"
+
+#include "backends/simulated/capture/frame_metadata.h"
+
+#include <algorithm>
+#include <limits>
+#include <string>
+#include <utility>
+
+namespace quazor {
+namespace {
+
+__extension__ using Wide = __int128;
+
+// Nanoseconds times millionths of a frame per second, for one frame.
+constexpr Wide kFrame = Wide{1'000'000'000} * 1'000'000;
+
+constexpr std::int32_t kTimescale = 1'000'000'000;
+
+MediaTime mediaTime(std::chrono::nanoseconds sinceStart) {
+  MediaTime time;
+  time.value = sinceStart.count();
+  time.timescale = kTimescale;
+  return time;
+}
+
+}  // namespace
+
+std::chrono::nanoseconds frameTime(MicroFrameRate rate, std::uint64_t frame) {
+  const Wide time = ((static_cast<Wide>(frame) + 1) * kFrame + static_cast<Wide>(rate) - 1) / static_cast<Wide>(rate);
+  constexpr Wide kHighest = std::numeric_limits<std::int64_t>::max();
+  return std::chrono::nanoseconds(static_cast<std::int64_t>(std::min(time, kHighest)));
+}
+
+class FrameDelivery::Entry {
+ public:
+  explicit Entry(FrameDelivery& delivery) : delivery_(delivery) {
+    const std::lock_guard lock(delivery_.mutex_);
+    entered_ = !delivery_.closed_;
+    if (entered_) delivery_.calling_.push_back(std::this_thread::get_id());
+  }
+  Entry(const Entry&) = delete;
+  Entry& operator=(const Entry&) = delete;
+  ~Entry() {
+    if (!entered_) return;
+    const std::lock_guard lock(delivery_.mutex_);
+    std::vector<std::thread::id>& calling = delivery_.calling_;
+    calling.erase(std::ranges::find(calling, std::this_thread::get_id()));
+    if (delivery_.closed_) delivery_.quiet_.notify_all();
+  }
+
+  bool entered() const { return entered_; }
+
+ private:
+  FrameDelivery& delivery_;
+  bool entered_ = false;
+};
+
+FrameDelivery::FrameDelivery(Source source, std::shared_ptr<PixelBufferPool> pool, std::shared_ptr<Clock> clock)
+    : source_(std::move(source)), pool_(std::move(pool)), clock_(std::move(clock)) {
+  const std::optional<Projector>& projector = source_.camera.projector;
+  if (!projector) {
+    usual_ = Value(Dictionary{});
+    return;
+  }
+  const Dictionary healthy = healthyMetadata(source_.lit);
+  usual_ = attachmentOf(healthy, projector->metadata);
+  const Dictionary base = usual_ && usual_->dictionary() != nullptr ? *usual_->dictionary() : healthy;
+  for (const auto& [frame, special] : projector->frames) special_.emplace(frame, attachmentOf(base, special));
+}
+
+void FrameDelivery::begin(Concurrency& concurrency) {
+  for (std::uint64_t i = 0; i < source_.camera.delivery.queues; ++i) {
+    queues_.push_back(
+        concurrency.makeSerialQueue("SimulatedCapture." + source_.camera.id, QualityOfService::kUserInteractive));
+  }
+  if (source_.events != nullptr) {
+    for (const CameraEvent& event : source_.camera.delivery.events) armEvent(event);
+  }
+  if (source_.frames == nullptr || !source_.camera.deliversFrames) return;
+  for (std::size_t i = 0; i < queues_.size(); ++i) arm(i, i);
+}
+
+// A queue's next frame. The tasks do not keep the delivery: with its owner's reference the frames end.
+void FrameDelivery::arm(std::size_t queue, std::uint64_t frame) {
+  queues_[queue]->asyncAfter(arrival(frame) - sinceStart(), [weak = weak_from_this(), queue, frame] {
+    const std::shared_ptr<FrameDelivery> self = weak.lock();
+    if (self == nullptr) return;
+    self->deliver(frame);
+    self->arm(queue, frame + self->queues_.size());
+  });
+}
+
+void FrameDelivery::armEvent(const CameraEvent& event) {
+  queues_.front()->asyncAfter(event.at - sinceStart(), [weak = weak_from_this(), event] {
+    const std::shared_ptr<FrameDelivery> self = weak.lock();
+    if (self == nullptr) return;
+    const Entry entry(*self);
+    if (entry.entered()) (*self->source_.events)(event.number, mediaTime(event.at), nullptr);
+  });
+}
+
+void FrameDelivery::deliver(std::uint64_t frame) {
+  if (isDropped(frame)) return;
+  const Entry entry(*this);
+  if (entry.entered()) callHandler(frame);
+}
+
+void FrameDelivery::callHandler(std::uint64_t frame) {
+  PixelBuffer& buffer = pool_->take(source_.index, frame, attachment(frame));
+  (*source_.frames)(buffer, mediaTime(frameTime(source_.run.rate, frame)));
+  buffer.release();
+}
+
+bool FrameDelivery::isDropped(std::uint64_t frame) const {
+  const Camera& camera = source_.camera;
+  return camera.droppedFrames.contains(frame) || (camera.dropEvery != 0 && (frame + 1) % camera.dropEvery == 0);
+}
+
+// When the frame reaches the handler: a burst holds frames back.
+std::chrono::nanoseconds FrameDelivery::arrival(std::uint64_t frame) const {
+  std::uint64_t with = frame;
+  for (const FrameBurst& burst : source_.camera.delivery.bursts) {
+    if (frame >= burst.at && frame - burst.at < burst.count) with = std::max(with, burst.at + burst.count - 1);
+  }
+  return frameTime(source_.run.rate, with);
+}
+
+std::optional<Value> FrameDelivery::attachment(std::uint64_t frame) const {
+  if (!special_.empty()) {
+    if (const auto found = special_.find(frame); found != special_.end()) return found->second;
+  }
+  return usual_;
+}
+
+void FrameDelivery::close() {
+  const std::lock_guard lock(mutex_);
+  closed_ = true;
+}
+
+void FrameDelivery::finish() {
+  const DeliveryTraits& traits = source_.camera.delivery;
+  if (traits.stopWaitsForHandlers) {
+    std::unique_lock lock(mutex_);
+    quiet_.wait(lock, [this] {
+      return std::ranges::all_of(calling_, [](std::thread::id id) { return id == std::this_thread::get_id(); });
+    });
+  }
+  if (source_.frames == nullptr) return;
+  auto frame = static_cast<std::uint64_t>(Wide{sinceStart().count()} * static_cast<Wide>(source_.run.rate) / kFrame);
+  for (std::uint64_t i = 0; i < traits.framesAfterStop; ++i, ++frame) {
+    queues_.front()->async([self = shared_from_this(), frame] { self->callHandler(frame); });
+  }
+}
+
+std::uint64_t FrameDelivery::push(std::uint64_t count) {
+  if (source_.frames == nullptr) return 0;
+  for (std::uint64_t delivered = 0; delivered < count; ++delivered) {
+    const Entry entry(*this);
+    if (!entry.entered()) return delivered;
+    callHandler(pushed_.fetch_add(1, std::memory_order_relaxed));
+  }
+  return count;
+}
+
+}  // namespace quazor

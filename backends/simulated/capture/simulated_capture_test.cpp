@@ -1,0 +1,302 @@
+#include "backends/simulated/capture/simulated_capture.h"
+
+#include "backends/simulated/phone_for_tests.h"
+
+#include <gtest/gtest.h>
+
+#include <functional>
+#include <memory>
+#include <string>
+
+namespace quazor {
+namespace {
+
+using namespace std::chrono_literals;
+using Code = CaptureErrorCode;
+
+class SimulatedCaptureTest : public ::testing::Test {
+ protected:
+  std::string request(const PhoneUser& user, const CaptureStreams& streams) {
+    return outcome([&](DiagnosticErrorPtr* error) { return user.device->requestControlOfStreams(streams, error); });
+  }
+  std::string relinquish(const PhoneUser& user, const CaptureStreams& streams) {
+    return outcome([&](DiagnosticErrorPtr* error) { return user.device->relinquishControlOfStreams(streams, error); });
+  }
+  std::string configure(const Value& value) {
+    return outcome([&](DiagnosticErrorPtr* error) {
+      return user_.device->setValue(value, capture_key::MultiCamConfiguration, error);
+    });
+  }
+  static Value groups(Array list) { return Dictionary{{"ActiveSynchronizedStreamsGroups", std::move(list)}}; }
+
+  SimulatedPhone phone_{smallScenario(), PhoneTime::kVirtual, 1};
+  PhoneUser user_{phone_};
+};
+
+TEST_F(SimulatedCaptureTest, ObjectsDescribeThemselves) {
+  const auto plugIn = phone_.platform().capture->createPlugIn();
+  EXPECT_EQ(plugIn->description(), "capture plug-in");
+  EXPECT_EQ(plugIn->device(nullptr)->description(), "capture device");
+}
+
+TEST_F(SimulatedCaptureTest, PlugInsAreNewAndTheDefaultOneIsShared) {
+  const auto service = phone_.platform().capture;
+  EXPECT_NE(service->createPlugIn(), service->createPlugIn());
+  EXPECT_NE(service->defaultPlugIn(), nullptr);
+  EXPECT_EQ(service->defaultPlugIn(), service->defaultPlugIn());
+}
+
+TEST_F(SimulatedCaptureTest, StreamsAndGroupsAreTheSameObjectsOnEveryPath) {
+  EXPECT_EQ(user_.device->streams(nullptr), user_.streams);
+  EXPECT_EQ(user_.device->synchronizedStreamsGroups(nullptr), user_.groups);
+  EXPECT_EQ((*user_.groups[1]->streams(nullptr))[0], user_.streams[2]);
+}
+
+TEST_F(SimulatedCaptureTest, EveryDeviceIsAUserOfItsOwn) {
+  const PhoneUser other(phone_);
+  EXPECT_NE(other.streams[0], user_.streams[0]);
+  EXPECT_EQ(request(user_, {user_.streams[0]}), "done");
+  EXPECT_EQ(request(other, {other.streams[0]}),
+            refusal(Code::kControlledByAnother, "wide is under control of another user."));
+  EXPECT_EQ(outcome([&](DiagnosticErrorPtr* error) { return other.wide().start(error); }),
+            refusal(Code::kControlledByAnother, "wide is under control of another user."));
+}
+
+TEST_F(SimulatedCaptureTest, ControlIsTakenOfAllStreamsOrNone) {
+  const PhoneUser other(phone_);
+  ASSERT_EQ(request(other, {other.streams[1]}), "done");
+  EXPECT_EQ(request(user_, user_.streams),
+            refusal(Code::kControlledByAnother, "tele is under control of another user."));
+  EXPECT_EQ(request(other, {other.streams[0], other.streams[2]}), "done");
+}
+
+TEST_F(SimulatedCaptureTest, ControlMayBeTakenAgainByItsHolder) {
+  EXPECT_EQ(request(user_, {user_.streams[0]}), "done");
+  EXPECT_EQ(request(user_, user_.streams), "done");
+}
+
+TEST_F(SimulatedCaptureTest, ControlIsGivenBackOfAllStreamsOrNone) {
+  const PhoneUser other(phone_);
+  ASSERT_EQ(request(user_, {user_.streams[0]}), "done");
+  EXPECT_EQ(relinquish(user_, user_.backStreams()),
+            refusal(Code::kNotControlled, "tele is not under control; request control of it first."));
+  EXPECT_EQ(request(other, {other.streams[0]}),
+            refusal(Code::kControlledByAnother, "wide is under control of another user."));
+  EXPECT_EQ(relinquish(user_, {user_.streams[0]}), "done");
+  EXPECT_EQ(request(other, {other.streams[0]}), "done");
+}
+
+TEST_F(SimulatedCaptureTest, ARunningStreamIsNotGivenBack) {
+  ASSERT_TRUE(user_.control({user_.streams[0]}) && user_.wide().start(nullptr));
+  EXPECT_EQ(relinquish(user_, {user_.streams[0]}),
+            refusal(Code::kWrongState, "wide is running; stop it before giving it back."));
+}
+
+TEST_F(SimulatedCaptureTest, StreamsOfOthersAreRefused) {
+  const PhoneUser other(phone_);
+  EXPECT_EQ(request(user_, {other.streams[0]}),
+            refusal(Code::kForeignObject, "stream wide (BackFacingCamera) is no stream of this device."));
+  EXPECT_EQ(relinquish(user_, {nullptr}), refusal(Code::kForeignObject, "(null) is no stream of this device."));
+}
+
+TEST_F(SimulatedCaptureTest, WhatAUserHadIsFreeWhenItsLastObjectIsGone) {
+  auto leaving = std::make_unique<PhoneUser>(phone_);
+  ASSERT_TRUE(leaving->control(leaving->streams) && leaving->wide().start(nullptr));
+  std::shared_ptr<CaptureStream> last = leaving->streams[2];
+  leaving.reset();
+  EXPECT_EQ(request(user_, user_.streams),
+            refusal(Code::kControlledByAnother, "wide is under control of another user."));
+  last.reset();
+  EXPECT_EQ(request(user_, user_.streams), "done");
+  EXPECT_TRUE(user_.wide().start(nullptr));
+}
+
+TEST_F(SimulatedCaptureTest, AnInvalidatedDeviceGivesBackWhatItHadAndRefusesEveryCall) {
+  const PhoneUser other(phone_);
+  ASSERT_TRUE(user_.control(user_.streams) && user_.wide().start(nullptr));
+  EXPECT_TRUE(user_.device->invalidate(nullptr));
+  EXPECT_EQ(request(other, other.streams), "done");
+  EXPECT_TRUE(other.wide().start(nullptr));
+
+  const std::string expected =
+      refusal(Code::kInvalidated, "The capture device has been invalidated; ask for a new one.");
+  const std::function<bool(DiagnosticErrorPtr*)> calls[] = {
+      [&](DiagnosticErrorPtr* error) { return user_.device->streams(error).has_value(); },
+      [&](DiagnosticErrorPtr* error) { return user_.device->synchronizedStreamsGroups(error).has_value(); },
+      [&](DiagnosticErrorPtr* error) { return user_.device->requestControlOfStreams({}, error); },
+      [&](DiagnosticErrorPtr* error) { return user_.device->relinquishControlOfStreams({}, error); },
+      [&](DiagnosticErrorPtr* error) { return user_.device->invalidate(error); },
+      [&](DiagnosticErrorPtr* error) {
+        return user_.device->valueForProperty(capture_key::MultiCamConfiguration, error).has_value();
+      },
+      [&](DiagnosticErrorPtr* error) {
+        return user_.device->setValue(groups({}), capture_key::MultiCamConfiguration, error);
+      },
+      [&](DiagnosticErrorPtr* error) { return user_.back().streams(error).has_value(); },
+      [&](DiagnosticErrorPtr* error) {
+        return user_.back().valueForProperty(capture_key::ActiveStreams, error).has_value();
+      },
+      [&](DiagnosticErrorPtr* error) { return user_.back().setValue(Array{}, capture_key::ActiveStreams, error); },
+      [&](DiagnosticErrorPtr* error) {
+        return user_.wide().valueForProperty(capture_key::PortType, error).has_value();
+      },
+      [&](DiagnosticErrorPtr* error) { return user_.wide().setValue(0, capture_key::FormatIndex, error); },
+      [&](DiagnosticErrorPtr* error) { return user_.wide().start(error); },
+      [&](DiagnosticErrorPtr* error) { return user_.wide().stop(error); },
+  };
+  for (const auto& call : calls) EXPECT_EQ(outcome(call), expected) << "call " << &call - calls;
+}
+
+TEST_F(SimulatedCaptureTest, TheConfigurationOfTheSessionReadsBack) {
+  EXPECT_EQ(user_.device->valueForProperty(capture_key::MultiCamConfiguration, nullptr), groups({}));
+  ASSERT_TRUE(user_.configureSession());
+  EXPECT_EQ(user_.device->valueForProperty(capture_key::MultiCamConfiguration, nullptr), groups({user_.groups[0]}));
+  EXPECT_EQ(configure(groups({})), "done");
+  EXPECT_EQ(user_.device->valueForProperty(capture_key::MultiCamConfiguration, nullptr), groups({}));
+}
+
+TEST_F(SimulatedCaptureTest, ConfigurationsThatDoNotFitAreRefusedAndChangeNothing) {
+  ASSERT_TRUE(user_.configureSession());
+  const PhoneUser other(phone_);
+  constexpr const char* kShape =
+      "capture device: MultiCamConfiguration must be a dictionary with the one entry ActiveSynchronizedStreamsGroups, "
+      "an array.";
+  const struct {
+    const char* name;
+    Value value;
+    Code code;
+    const char* message;
+  } kRows[] = {
+      {"no dictionary", 1, Code::kWrongType, kShape},
+      {"an empty dictionary", Dictionary{}, Code::kWrongType, kShape},
+      {"no array", Dictionary{{"ActiveSynchronizedStreamsGroups", user_.groups[0]}}, Code::kWrongType, kShape},
+      {"an entry more", Dictionary{{"ActiveSynchronizedStreamsGroups", Array{}}, {"Speed", 1}}, Code::kWrongType,
+       kShape},
+      {"no group", groups({"back"}), Code::kForeignObject,
+       "capture device: ActiveSynchronizedStreamsGroups must hold groups of this device, not the string back."},
+      {"a group of another user", groups({other.groups[0]}), Code::kForeignObject,
+       "capture device: ActiveSynchronizedStreamsGroups must hold groups of this device, not group back."},
+      {"a group twice", groups({user_.groups[0], user_.groups[0]}), Code::kOutOfRange,
+       "capture device: ActiveSynchronizedStreamsGroups must hold a group once, not group back twice."},
+      {"a group whose master is not active", groups({user_.groups[1]}), Code::kWrongState,
+       "group selfie: its master front is not active; set ActiveStreams first."},
+  };
+  for (const auto& row : kRows) EXPECT_EQ(configure(row.value), refusal(row.code, row.message)) << row.name;
+  EXPECT_EQ(user_.device->valueForProperty(capture_key::MultiCamConfiguration, nullptr), groups({user_.groups[0]}));
+}
+
+TEST_F(SimulatedCaptureTest, ASessionNeedsControlAndStreamsThatDoNotRun) {
+  ASSERT_TRUE(user_.configureSession() && user_.tele().start(nullptr));
+  EXPECT_EQ(configure(groups({user_.groups[0]})),
+            refusal(Code::kWrongState, "capture device: MultiCamConfiguration cannot be set while tele is running."));
+  ASSERT_TRUE(user_.tele().stop(nullptr));
+  ASSERT_EQ(relinquish(user_, {user_.streams[1]}), "done");
+  EXPECT_EQ(configure(groups({user_.groups[0]})),
+            refusal(Code::kNotControlled, "tele is not under control; request control of it first."));
+}
+
+TEST_F(SimulatedCaptureTest, DevicePropertiesThatAreUnknownOrReadOnlyAreRefused) {
+  const std::string unknown =
+      refusal(Code::kUnknownProperty,
+              "capture device has no property PortType; it has MultiCamConfiguration, MulticamSessionStatus.");
+  EXPECT_EQ(outcome([&](DiagnosticErrorPtr* error) { return user_.device->valueForProperty("PortType", error); }),
+            unknown);
+  EXPECT_EQ(outcome([&](DiagnosticErrorPtr* error) { return user_.device->setValue(1, "PortType", error); }), unknown);
+  EXPECT_EQ(outcome([&](DiagnosticErrorPtr* error) {
+              return user_.device->setValue(1, capture_key::MulticamSessionStatus, error);
+            }),
+            refusal(Code::kReadOnlyProperty, "capture device: MulticamSessionStatus can only be read."));
+}
+
+TEST_F(SimulatedCaptureTest, ThereIsNoStatusBeforeTheMasterOfASessionHasStarted) {
+  const auto status = [&] {
+    return outcome([&](DiagnosticErrorPtr* error) {
+      return user_.device->valueForProperty(capture_key::MulticamSessionStatus, error);
+    });
+  };
+  const std::string none = refusal(Code::kUnreadableProperty,
+                                   "capture device: MulticamSessionStatus cannot be read before a synchronised session "
+                                   "has begun: set MultiCamConfiguration, then start the master.");
+  EXPECT_EQ(status(), none);
+  ASSERT_TRUE(user_.configureSession());
+  EXPECT_EQ(status(), none);
+  ASSERT_TRUE(user_.tele().start(nullptr));
+  EXPECT_EQ(status(), none);
+  ASSERT_TRUE(user_.wide().start(nullptr));
+  EXPECT_EQ(status(), "done");
+}
+
+TEST_F(SimulatedCaptureTest, TheStatusFollowsFromWhatWasStreamed) {
+  const auto clock = phone_.platform().clock;
+  ASSERT_TRUE(user_.configureSession() && user_.wide().start(nullptr));
+  EXPECT_EQ(user_.status(),
+            "{BackFacingCamera = {Offset = 0; FrameCount = -1}; "
+            "BackFacingTelephotoCamera = {Offset = 0; FrameCount = -1}}");
+  clock->sleep(100ms);
+  ASSERT_TRUE(user_.tele().start(nullptr));
+  clock->sleep(1900ms);
+  EXPECT_EQ(user_.status(),
+            "{BackFacingCamera = {Offset = 0; FrameCount = 60}; "
+            "BackFacingTelephotoCamera = {Offset = 3; FrameCount = 57}}");
+  ASSERT_TRUE(user_.tele().stop(nullptr));
+  clock->sleep(1s);
+  ASSERT_TRUE(user_.wide().stop(nullptr));
+  clock->sleep(1s);
+  EXPECT_EQ(user_.status(),
+            "{BackFacingCamera = {Offset = 0; FrameCount = 90}; "
+            "BackFacingTelephotoCamera = {Offset = 3; FrameCount = 57}}");
+}
+
+TEST_F(SimulatedCaptureTest, TheStatusCountsAtTheRateThatWasSet) {
+  ASSERT_TRUE(user_.configureSession());
+  for (const auto& stream : user_.backStreams()) {
+    ASSERT_TRUE(stream->setValue(1, capture_key::FormatIndex, nullptr));
+    ASSERT_TRUE(stream->setValue(10, capture_key::MinimumFrameRate, nullptr));
+    ASSERT_TRUE(stream->setValue(50, capture_key::MaximumFrameRate, nullptr));
+    ASSERT_TRUE(stream->start(nullptr));
+  }
+  phone_.platform().clock->sleep(2s);
+  EXPECT_EQ(user_.status(),
+            "{BackFacingCamera = {Offset = 0; FrameCount = 100}; "
+            "BackFacingTelephotoCamera = {Offset = 0; FrameCount = 100}}");
+}
+
+TEST_F(SimulatedCaptureTest, ANewConfigurationIsANewSession) {
+  ASSERT_TRUE(user_.configureSession() && user_.wide().start(nullptr));
+  phone_.platform().clock->sleep(1s);
+  ASSERT_TRUE(user_.wide().stop(nullptr));
+  ASSERT_EQ(configure(groups({user_.groups[0]})), "done");
+  EXPECT_EQ(user_.status(), "(null)");
+}
+
+TEST(SimulatedCaptureTraits, TheStatusFollowsTheCamerasOfTheScenario) {
+  Scenario scenario = smallScenario();
+  scenario.cameras[0].actualFrameRate = 29.5;
+  scenario.cameras[1].inSessionStatus = false;
+  const SimulatedPhone phone(scenario, PhoneTime::kVirtual, 1);
+  const PhoneUser user(phone);
+  ASSERT_TRUE(user.configureSession() && user.wide().start(nullptr) && user.tele().start(nullptr));
+  phone.platform().clock->sleep(2s);
+  EXPECT_EQ(user.status(), "{BackFacingCamera = {Offset = 0; FrameCount = 59}}");
+}
+
+TEST(SimulatedCaptureTraits, APlugInThatDoesNotLoadIsNull) {
+  Scenario scenario = smallScenario();
+  scenario.device.plugInLoads = false;
+  const SimulatedPhone phone(scenario, PhoneTime::kVirtual, 1);
+  EXPECT_EQ(phone.platform().capture->createPlugIn(), nullptr);
+  EXPECT_EQ(phone.platform().capture->defaultPlugIn(), nullptr);
+}
+
+TEST(SimulatedCaptureTraits, APhoneWithoutADeviceSaysSo) {
+  Scenario scenario = smallScenario();
+  scenario.device.present = false;
+  const SimulatedPhone phone(scenario, PhoneTime::kVirtual, 1);
+  const auto plugIn = phone.platform().capture->createPlugIn();
+  EXPECT_EQ(outcome([&](DiagnosticErrorPtr* error) { return plugIn->device(error); }),
+            refusal(Code::kNoDevice, "The phone has no capture device."));
+  EXPECT_EQ(plugIn->device(nullptr), nullptr);
+}
+
+}  // namespace
+}  // namespace quazor

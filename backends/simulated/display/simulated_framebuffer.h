@@ -1,0 +1,27 @@
+// The framebuffer service of the simulated phone.
+#pragma once
+
+#include "backends/simulated/calls/call_interceptor.h"
+#include "backends/simulated/scenario/display_traits.h"
+#include "platform/framebuffer_service.h"
+
+#include <memory>
+
+namespace quazor {
+
+// The scenario's main display, which never changes. Thread: any.
+class SimulatedFramebufferService final : public FramebufferService {
+ public:
+  SimulatedFramebufferService(const DisplayTraits& display, std::shared_ptr<CallInterceptor> calls);
+
+  std::shared_ptr<Display> mainDisplay() override;
+
+ private:
+  class MainDisplay;
+  class Registry;
+
+  const std::shared_ptr<const DisplayTraits> display_;
+  const std::shared_ptr<CallInterceptor> calls_;
+};
+
+}  // namespace quazor

@@ -1,0 +1,37 @@
+// The HID service of the simulated phone.
+#pragma once
+
+#include "backends/simulated/calls/call_interceptor.h"
+#include "backends/simulated/hid/hid_sensor.h"
+#include "backends/simulated/scenario/hid_traits.h"
+#include "platform/clock.h"
+#include "platform/concurrency.h"
+#include "platform/hid.h"
+
+#include <memory>
+#include <vector>
+
+namespace quazor {
+
+// The scenario's devices, in its order. Every enumeration makes device objects of its own; what they are set to, and
+// the count of the reports, is the device's and common to all.
+//
+// Thread: any; a device object as platform/hid.h says. Device objects may be closed, unscheduled and destroyed at any
+// moment, by their receivers too.
+class SimulatedHidService final : public HidService {
+ public:
+  SimulatedHidService(const std::vector<HidDeviceTraits>& devices, const std::shared_ptr<Clock>& clock,
+                      Concurrency& concurrency, std::shared_ptr<CallInterceptor> calls);
+
+  std::shared_ptr<HidManager> createManager() override;
+
+ private:
+  class Device;
+  class Manager;
+  using Sensors = std::vector<std::shared_ptr<HidSensor>>;
+
+  const std::shared_ptr<const Sensors> sensors_;
+  const std::shared_ptr<CallInterceptor> calls_;
+};
+
+}  // namespace quazor

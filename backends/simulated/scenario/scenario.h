@@ -1,0 +1,98 @@
+// Scenario: a whole simulated phone, as data. data/scenarios/scenario.schema.json describes the files.
+#pragma once
+
+#include "backends/simulated/scenario/display_traits.h"
+#include "backends/simulated/scenario/fault.h"
+#include "backends/simulated/scenario/frame_traits.h"
+#include "backends/simulated/scenario/hid_traits.h"
+#include "backends/simulated/scenario/report_traits.h"
+#include "contract/ordered_map.h"
+#include "contract/value.h"
+
+#include <cstdint>
+#include <filesystem>
+#include <optional>
+#include <set>
+#include <string>
+#include <vector>
+
+namespace quazor {
+
+// Frame rates, in frames per second, are kept to a millionth and are at most this.
+inline constexpr double kHighestFrameRate = 1000;
+
+struct CameraFormat {
+  double maximumFrameRate = 30;
+};
+
+struct Camera {
+  std::string id;    // names the camera in the scenario and in faults
+  std::string port;  // its port type (platform/capture_keys.h)
+  std::vector<CameraFormat> formats;
+  bool multipleOutputs = true;  // takes MultipleOutputSupportEnabled
+
+  // Streaming. Frame numbers count from 0, the first that the camera could deliver.
+  std::uint64_t firstFrameOffset = 0;     // frames of the master before the camera's first, when all start as one
+  std::optional<double> actualFrameRate;  // instead of the one that was set
+  bool deliversFrames = true;             // false: runs, and no frame comes
+  std::set<std::uint64_t> droppedFrames;  // the numbers of frames that are lost
+  std::uint64_t dropEvery = 0;            // every nth frame is lost; 0: none
+  bool inSessionStatus = true;            // false: the session's status leaves the camera out
+  std::optional<Dictionary> errorCounters = defaultErrorCounters();  // nothing: cannot be read
+  Dictionary errorCounterGrowth;       // errors per second of the stream's present or last stretch, by counter
+  std::optional<Projector> projector;  // nothing: the camera has none
+  DeliveryTraits delivery;
+
+  // All of the counters that the hardware has, at 0.
+  static Dictionary defaultErrorCounters();
+};
+
+// Cameras that can run as one synchronised session.
+struct CameraGroup {
+  std::string id;
+  std::vector<std::string> cameras;  // ids, in the group's order
+  std::string master;                // the id of one of them
+  bool masterConfiguration = true;   // supports SlaveConfigurationByPortType in MasterConfiguration
+};
+
+struct CaptureDeviceTraits {
+  bool plugInLoads = true;  // false: no capture plug-in can be made
+  bool present = true;      // false: the plug-in finds no device
+};
+
+// An experiment that is run alone.
+struct ExperimentRun {
+  std::string name;
+  OrderedMap<double> parameters;
+  std::optional<std::uint64_t> images;  // how many its result holds; nothing: not looked at
+};
+
+// What a run on the phone is to end in.
+struct Expectation {
+  enum class Verdict { kPass, kFail, kError };
+
+  std::optional<ExperimentRun> experiment;  // nothing: a diagnostic is run
+  Verdict verdict = Verdict::kPass;
+  std::optional<FaultError> error;         // nothing: the run gives no error
+  std::optional<FaultError> underlying;    // nothing: that error has no underlying one
+  std::vector<std::string> failedResults;  // the names of the measured results outside their limits
+};
+
+struct Scenario {
+  std::string title;
+  CaptureDeviceTraits device;
+  std::vector<Camera> cameras;
+  std::vector<CameraGroup> groups;
+  std::vector<ReportChannelTraits> reports;
+  std::vector<HidDeviceTraits> hidDevices;
+  DisplayTraits display;
+  std::vector<Fault> faults;
+  OrderedMap<Expectation> expectations;  // by the diagnostic's name, or any name of a run of an experiment
+};
+
+// Reads a scenario file and the files it is based on. On failure nothing, and in *problem, unless `problem` is null,
+// one sentence without a line end: the file, the line of a syntax error or the JSON path of a wrong value, what is
+// wrong and what would be right. Any thread.
+std::optional<Scenario> readScenario(const std::filesystem::path& file, std::string* problem);
+
+}  // namespace quazor

@@ -1,0 +1,298 @@
+#include "backends/simulated/scenario/scenario_content.h"
+
+#include "backends/simulated/scenario/capture_catalogue.h"
+#include "backends/simulated/scenario/report_operations.h"
+#include "backends/simulated/scenario/scenario_frames.h"
+#include "backends/simulated/scenario/scenario_parts.h"
+#include "backends/simulated/scenario/scenario_sensors.h"
+#include "backends/simulated/scenario/sensor_operations.h"
+
+#include <algorithm>
+#include <array>
+#include <cstdint>
+#include <limits>
+#include <string_view>
+#include <vector>
+
+namespace quazor {
+namespace {
+
+using Names = std::vector<std::string_view>;
+
+constexpr std::uint64_t kMostFrames = 1'000'000'000;
+constexpr double kLongestDelay = 1e9;
+
+bool booleanOr(const JsonCursor& object, std::string_view key, bool otherwise) {
+  const std::optional<JsonCursor> entry = object.find(key);
+  return entry ? entry->boolean() : otherwise;
+}
+
+// Ids stand in paths, lists and on command lines.
+void checkId(const std::string& id, const JsonCursor& cursor) {
+  const auto fits = [](char c) {
+    return (c >= 'a' && c <= 'z') || (c >= 'A' && c <= 'Z') || (c >= '0' && c <= '9') || c == '-' || c == '_';
+  };
+  if (id.empty() || !std::ranges::all_of(id, fits)) {
+    cursor.fail("the id must be made of letters, digits, \"-\" and \"_\".");
+  }
+}
+
+Names idsOf(const std::vector<Camera>& cameras) {
+  Names ids;
+  for (const Camera& camera : cameras) ids.push_back(camera.id);
+  return ids;
+}
+
+Names idsOf(const std::vector<CameraGroup>& groups) {
+  Names ids;
+  for (const CameraGroup& group : groups) ids.push_back(group.id);
+  return ids;
+}
+
+CaptureDeviceTraits readDevice(const JsonCursor& cursor) {
+  cursor.allowKeys({"plugInLoads", "present"});
+  CaptureDeviceTraits device;
+  device.plugInLoads = booleanOr(cursor, "plugInLoads", device.plugInLoads);
+  device.present = booleanOr(cursor, "present", device.present);
+  return device;
+}
+
+std::vector<CameraFormat> readFormats(const JsonCursor& cursor) {
+  std::vector<CameraFormat> formats;
+  for (const JsonCursor& element : cursor.elements()) {
+    element.allowKeys({"maximumFrameRate"});
+    formats.push_back({element.at("maximumFrameRate").positiveNumber(kHighestFrameRate)});
+  }
+  if (formats.empty()) cursor.fail("a camera must have at least one format.");
+  return formats;
+}
+
+std::set<std::uint64_t> readDroppedFrames(const JsonCursor& cursor) {
+  std::set<std::uint64_t> frames;
+  for (const JsonCursor& element : cursor.elements()) {
+    if (!frames.insert(element.integer(0, kMostFrames)).second) element.fail("the frame stands twice; leave one.");
+  }
+  return frames;
+}
+
+std::optional<Dictionary> readErrorCounters(const JsonCursor& cursor) {
+  if (cursor.isString()) {
+    constexpr std::array<std::string_view, 1> kWords{"unreadable"};
+    cursor.oneOf(kWords, "a state of the counters");
+    return std::nullopt;
+  }
+  Dictionary counters = Camera::defaultErrorCounters();
+  for (const auto& [name, count] : cursor.entries()) {
+    counters.set(name, count.integer(0, std::numeric_limits<std::uint64_t>::max()));
+  }
+  return counters;
+}
+
+Camera readCamera(const std::string& id, const JsonCursor& cursor) {
+  checkId(id, cursor);
+  cursor.allowKeys({"port", "formats", "multipleOutputs", "firstFrameOffset", "actualFrameRate", "deliversFrames",
+                    "droppedFrames", "dropEvery", "inSessionStatus", "errorCounters", "errorCounterGrowth", "projector",
+                    "delivery"});
+  Camera camera;
+  camera.id = id;
+  camera.port = cursor.at("port").oneOf(kPortTypes, "a port type");
+  camera.formats = readFormats(cursor.at("formats"));
+  camera.multipleOutputs = booleanOr(cursor, "multipleOutputs", camera.multipleOutputs);
+  camera.deliversFrames = booleanOr(cursor, "deliversFrames", camera.deliversFrames);
+  camera.inSessionStatus = booleanOr(cursor, "inSessionStatus", camera.inSessionStatus);
+  if (const auto offset = cursor.find("firstFrameOffset")) camera.firstFrameOffset = offset->integer(0, kMostFrames);
+  if (const auto rate = cursor.find("actualFrameRate"))
+    camera.actualFrameRate = rate->positiveNumber(kHighestFrameRate);
+  if (const auto frames = cursor.find("droppedFrames")) camera.droppedFrames = readDroppedFrames(*frames);
+  if (const auto every = cursor.find("dropEvery")) camera.dropEvery = every->integer(1, kMostFrames);
+  if (const auto counters = cursor.find("errorCounters")) camera.errorCounters = readErrorCounters(*counters);
+  if (const auto growth = cursor.find("errorCounterGrowth"))
+    camera.errorCounterGrowth = readErrorCounterGrowth(*growth);
+  if (const auto projector = cursor.find("projector")) camera.projector = readProjector(*projector);
+  if (const auto delivery = cursor.find("delivery")) camera.delivery = readDelivery(*delivery);
+  return camera;
+}
+
+CameraGroup readGroup(const std::string& id, const JsonCursor& cursor, const Scenario& scenario) {
+  checkId(id, cursor);
+  const Names cameras = idsOf(scenario.cameras);
+  cursor.allowKeys({"cameras", "master", "masterConfiguration"});
+  CameraGroup group;
+  group.id = id;
+  for (const JsonCursor& element : cursor.at("cameras").elements()) {
+    std::string camera = element.oneOf(cameras, "a camera of this scenario");
+    if (std::ranges::find(group.cameras, camera) != group.cameras.end()) {
+      element.fail("the camera stands twice; leave one.");
+    }
+    group.cameras.push_back(std::move(camera));
+  }
+  group.master = cursor.at("master").oneOf(Names(group.cameras.begin(), group.cameras.end()), "a camera of the group");
+  group.masterConfiguration = booleanOr(cursor, "masterConfiguration", group.masterConfiguration);
+  return group;
+}
+
+// Nothing for an entry that is missing or null.
+std::optional<FaultError> readOptionalError(const JsonCursor& object, std::string_view key) {
+  const std::optional<JsonCursor> entry = object.find(key);
+  if (!entry || entry->isNull()) return std::nullopt;
+  return readError(*entry);
+}
+
+// What the selectors of a fault may name: those of one operation, or of all together.
+struct Selectable {
+  Names objects;
+  Names properties;
+
+  void add(const CaptureOperation& operation, const Scenario& scenario) {
+    if (operation.on == CaptureObjectKind::kStream) append(objects, idsOf(scenario.cameras));
+    if (operation.on == CaptureObjectKind::kGroup) append(objects, idsOf(scenario.groups));
+    if (!operation.hasProperty) return;
+    for (const CaptureProperty& property : propertiesOf(operation.on)) append(properties, {property.key});
+  }
+  void add(const SensorOperation& operation, const Scenario& scenario) {
+    for (const HidDeviceTraits& device : scenario.hidDevices) {
+      if (operation.onDevice) append(objects, {device.name});
+      if (operation.property != SensorProperty::kFeatureReport) continue;
+      for (const HidFeatureReport& report : device.featureReports) append(properties, {hidReportName(report.id)});
+    }
+    if (operation.property != SensorProperty::kRegistryProperty) return;
+    for (const auto& [name, value] : scenario.display.properties) append(properties, {name});
+  }
+
+ private:
+  static void append(Names& to, const Names& names) {
+    for (const std::string_view name : names) {
+      if (std::ranges::find(to, name) == to.end()) to.push_back(name);
+    }
+  }
+};
+
+void readSelectors(const JsonCursor& cursor, const Scenario& scenario, Fault& fault) {
+  Names operations{"*"};
+  for (const CaptureOperation& operation : kCaptureOperations) operations.push_back(operation.name);
+  operations.insert(operations.end(), kReportOperations.begin(), kReportOperations.end());
+  for (const SensorOperation& operation : kSensorOperations) operations.push_back(operation.name);
+  fault.operation = cursor.at("operation").oneOf(operations, "an operation that can fail");
+
+  Selectable selectable;
+  for (const CaptureOperation& operation : kCaptureOperations) {
+    if (fault.operation == "*" || fault.operation == operation.name) selectable.add(operation, scenario);
+  }
+  for (const SensorOperation& operation : kSensorOperations) {
+    if (fault.operation == "*" || fault.operation == operation.name) selectable.add(operation, scenario);
+  }
+  if (const auto object = cursor.find("object")) {
+    if (selectable.objects.empty())
+      object->fail(fault.operation + " is not called on a camera, a group or a HID device; leave it out.");
+    fault.object = object->oneOf(selectable.objects, "an object of " + fault.operation);
+  }
+  if (const auto property = cursor.find("property")) {
+    if (selectable.properties.empty()) property->fail(fault.operation + " is about no property; leave it out.");
+    fault.property = property->oneOf(selectable.properties, "a property of " + fault.operation);
+  }
+  if (const auto occurrence = cursor.find("occurrence")) fault.occurrence = occurrence->integer(1, kMostFrames);
+}
+
+Fault readFault(const JsonCursor& cursor, const Scenario& scenario) {
+  constexpr std::array kActions{FaultAction::kFail, FaultAction::kNothing, FaultAction::kHang, FaultAction::kDelay};
+  cursor.allowKeys({"operation", "object", "property", "occurrence", "action", "error", "seconds"});
+  Fault fault;
+  readSelectors(cursor, scenario, fault);
+
+  Names names;
+  for (const FaultAction action : kActions) names.push_back(faultActionName(action));
+  const std::string name = cursor.at("action").oneOf(names, "an action");
+  fault.action = *std::ranges::find(kActions, name, &faultActionName);
+
+  if (const auto error = cursor.find("error")) {
+    if (fault.action != FaultAction::kFail) error->fail("only the action \"fail\" has an error.");
+    fault.error = readError(*error);
+  }
+  if (fault.action == FaultAction::kDelay) {
+    fault.seconds = cursor.at("seconds").positiveNumber(kLongestDelay);
+  } else if (const auto seconds = cursor.find("seconds")) {
+    seconds->fail("only the action \"delay\" has seconds.");
+  }
+  return fault;
+}
+
+ExperimentRun readExperimentRun(const JsonCursor& cursor) {
+  ExperimentRun run;
+  run.name = cursor.at("experiment").text();
+  if (const auto parameters = cursor.find("parameters")) {
+    constexpr double kHighest = std::numeric_limits<double>::max();
+    for (const auto& [name, value] : parameters->entries()) run.parameters.set(name, value.number(-kHighest, kHighest));
+  }
+  if (const auto images = cursor.find("images")) run.images = images->integer(0, kMostFrames);
+  return run;
+}
+
+void checkExperimentRun(const Expectation& expectation, const JsonCursor& cursor) {
+  if (!expectation.experiment) {
+    if (cursor.find("parameters")) cursor.fail("only a run of an experiment has parameters; name the \"experiment\".");
+    if (cursor.find("images")) cursor.fail("only a run of an experiment has images; name the \"experiment\".");
+    return;
+  }
+  if (expectation.verdict == Expectation::Verdict::kFail) {
+    cursor.fail("nobody judges an experiment that is run alone: it passes or ends in an error.");
+  }
+  if (expectation.experiment->images && expectation.verdict != Expectation::Verdict::kPass) {
+    cursor.fail("only the verdict \"pass\" has images.");
+  }
+}
+
+Expectation readExpectation(const JsonCursor& cursor) {
+  constexpr std::array<std::string_view, 3> kVerdicts{"pass", "fail", "error"};
+  cursor.allowKeys({"experiment", "parameters", "verdict", "error", "underlying", "failedResults", "images"});
+  Expectation expectation;
+  const std::string verdict = cursor.at("verdict").oneOf(kVerdicts, "a verdict");
+  if (verdict == "fail") expectation.verdict = Expectation::Verdict::kFail;
+  if (verdict == "error") expectation.verdict = Expectation::Verdict::kError;
+  expectation.error = readOptionalError(cursor, "error");
+  expectation.underlying = readOptionalError(cursor, "underlying");
+  if (expectation.error && verdict != "error") cursor.fail("only the verdict \"error\" has an error.");
+  if (expectation.underlying && !expectation.error) cursor.fail("an underlying error needs an error above it.");
+  if (const auto results = cursor.find("failedResults")) {
+    if (verdict != "fail") results->fail("only the verdict \"fail\" has failed results.");
+    for (const JsonCursor& result : results->elements()) expectation.failedResults.push_back(result.text());
+  }
+  if (cursor.find("experiment")) expectation.experiment = readExperimentRun(cursor);
+  checkExperimentRun(expectation, cursor);
+  return expectation;
+}
+
+}  // namespace
+
+Scenario scenarioOf(const JsonCursor& document) {
+  document.allowKeys({"$schema", "title", "base", "device", "cameras", "groups", "reports", "hidDevices", "display",
+                      "faults", "expect"});
+  Scenario scenario;
+  scenario.title = document.at("title").text();
+  if (const auto schema = document.find("$schema")) schema->text();
+  if (const auto device = document.find("device")) scenario.device = readDevice(*device);
+  for (const auto& [id, camera] : document.at("cameras").entries()) {
+    scenario.cameras.push_back(readCamera(id, camera));
+  }
+  for (const auto& [id, group] : document.at("groups").entries()) {
+    scenario.groups.push_back(readGroup(id, group, scenario));
+  }
+  if (const auto reports = document.find("reports")) scenario.reports = readReports(*reports);
+  if (const auto devices = document.find("hidDevices")) {
+    for (const auto& [name, device] : devices->entries()) {
+      checkId(name, device);
+      scenario.hidDevices.push_back(readHidDevice(name, device));
+    }
+  }
+  if (const auto display = document.find("display")) scenario.display = readDisplay(*display);
+  if (const auto faults = document.find("faults")) {
+    for (const JsonCursor& fault : faults->elements()) scenario.faults.push_back(readFault(fault, scenario));
+  }
+  if (const auto expect = document.find("expect")) {
+    for (const auto& [name, expectation] : expect->entries()) {
+      scenario.expectations.set(name, readExpectation(expectation));
+    }
+  }
+  return scenario;
+}
+
+}  // namespace quazor

@@ -1,0 +1,147 @@
+#include "backends/simulated/scenario/scenario_content.h"
+
+#include <gmock/gmock.h>
+#include <gtest/gtest.h>
+
+#include <string>
+#include <string_view>
+
+namespace quazor {
+namespace {
+
+using ::testing::IsEmpty;
+using ::testing::SizeIs;
+using Json = nlohmann::ordered_json;
+
+// A phone withEntry two sensors and a display, and one more entry.
+std::string withEntry(std::string_view entry) {
+  return R"({"title": "t", "cameras": {}, "groups": {},
+             "hidDevices": {"near": {"usagePage": 1, "usage": 2, "featureReports": {"0xAB": {}, "0x01": {}}},
+                            "far": {"usagePage": 1, "usage": 2, "featureReports": {"0xAC": {}, "0x01": {}}}},
+             "display": {"properties": {"Power": 1, "Name": "main"}})" +
+         (entry.empty() ? "" : ", " + std::string(entry)) + "}";
+}
+std::string withFaultEntries(std::string_view entries) {
+  return withEntry(R"("faults": [{"action": "fail", )" + std::string(entries) + "}]");
+}
+std::string withExpectedEntries(std::string_view entries) {
+  return withEntry(R"("expect": {"E": {)" + std::string(entries) + "}}");
+}
+
+Scenario read(const std::string& text) {
+  const Json document = Json::parse(text);
+  return scenarioOf(JsonCursor(document));
+}
+std::string problemOf(const std::string& text) {
+  try {
+    read(text);
+  } catch (const JsonProblem& problem) {
+    return problem.what();
+  }
+  return "nothing";
+}
+
+TEST(ScenarioContentTest, DevicesAndTheDisplayAreRead) {
+  const Scenario scenario = read(withEntry(""));
+  ASSERT_THAT(scenario.hidDevices, SizeIs(2));
+  EXPECT_EQ(scenario.hidDevices[0].name, "near");
+  EXPECT_EQ(scenario.hidDevices[1].name, "far");
+  EXPECT_EQ(scenario.hidDevices[1].featureReports.at(0).id, 0xAC);
+  EXPECT_EQ(scenario.display.properties, (Dictionary{{"Power", 1}, {"Name", "main"}}));
+  const Scenario plain = read(R"({"title": "t", "cameras": {}, "groups": {}})");
+  EXPECT_THAT(plain.hidDevices, IsEmpty());
+  EXPECT_TRUE(plain.display.present);
+}
+
+TEST(ScenarioContentTest, DevicesAreNamedAsCamerasAre) {
+  EXPECT_EQ(problemOf(R"({"title": "t", "cameras": {}, "groups": {}, "hidDevices": {"a b": {}}})"),
+            "hidDevices.a b: the id must be made of letters, digits, \"-\" and \"_\".");
+}
+
+TEST(ScenarioContentTest, FaultsMayNameDevicesReportsAndProperties) {
+  for (const char* entries : {
+           R"("operation": "HidService.createManager")",
+           R"("operation": "HidManager.enumerateDevicesMatching")",
+           R"("operation": "HidManager.devices")",
+           R"("operation": "HidDevice.open", "object": "far")",
+           R"("operation": "HidDevice.setInputReportCallback", "object": "near")",
+           R"("operation": "HidDevice.setFeatureReportWithID", "object": "near", "property": "0xAB")",
+           R"("operation": "HidDevice.setFeatureReportWithID", "property": "0x01")",
+           R"("operation": "HidDevice.scheduleWithRunLoop", "object": "near")",
+           R"("operation": "HidDevice.unscheduleFromRunLoop", "object": "near")",
+           R"("operation": "HidDevice.close", "object": "near")",
+           R"("operation": "FramebufferService.mainDisplay")",
+           R"("operation": "Display.registryService")",
+           R"("operation": "RegistryService.registryProperty", "property": "Power")",
+           R"("operation": "RunLoops.currentRunLoop")",
+           R"("operation": "*", "object": "far", "property": "0xAC")",
+           R"("operation": "*", "property": "Name")",
+       }) {
+    EXPECT_EQ(problemOf(withFaultEntries(entries)), "nothing") << entries;
+  }
+}
+
+TEST(ScenarioContentTest, FaultsThatWouldNeverFireAreRefused) {
+  const struct {
+    const char* name;
+    const char* entries;
+    const char* problem;
+  } kRows[] = {
+      {"a device that there is not", R"("operation": "HidDevice.open", "object": "nar")",
+       "faults[0].object: \"nar\" is not an object of HidDevice.open; did you mean \"near\"?"},
+      {"an operation on no device", R"("operation": "HidService.createManager", "object": "near")",
+       "faults[0].object: HidService.createManager is not called on a camera, a group or a HID device; leave it out."},
+      {"a feature report that there is not", R"("operation": "HidDevice.setFeatureReportWithID", "property": "0xEE")",
+       "faults[0].property: \"0xEE\" is not a property of HidDevice.setFeatureReportWithID; known are \"0xAB\", "
+       "\"0x01\", \"0xAC\"."},
+      {"a property that there is not", R"("operation": "RegistryService.registryProperty", "property": "Colour")",
+       "faults[0].property: \"Colour\" is not a property of RegistryService.registryProperty; known are \"Power\", "
+       "\"Name\"."},
+      {"a property where there is none", R"("operation": "HidDevice.open", "property": "0xAB")",
+       "faults[0].property: HidDevice.open is about no property; leave it out."},
+  };
+  for (const auto& row : kRows) EXPECT_EQ(problemOf(withFaultEntries(row.entries)), row.problem) << row.name;
+}
+
+TEST(ScenarioContentTest, ARunOfAnExperimentIsRead) {
+  const Scenario scenario = read(withExpectedEntries(
+      R"("experiment": "X", "parameters": {"images": 5, "timeout": -0.5}, "verdict": "pass", "images": 6)"));
+  const Expectation& expectation = *scenario.expectations.find("E");
+  ASSERT_TRUE(expectation.experiment);
+  EXPECT_EQ(expectation.experiment->name, "X");
+  EXPECT_EQ(expectation.experiment->parameters, (OrderedMap<double>{{"images", 5.0}, {"timeout", -0.5}}));
+  EXPECT_EQ(expectation.experiment->images, 6U);
+  EXPECT_EQ(expectation.verdict, Expectation::Verdict::kPass);
+  const Scenario bare = read(withExpectedEntries(R"("experiment": "X", "verdict": "error")"));
+  EXPECT_EQ(bare.expectations.find("E")->experiment->images, std::nullopt);
+  EXPECT_TRUE(bare.expectations.find("E")->experiment->parameters.empty());
+  const Scenario diagnostic = read(withExpectedEntries(R"("verdict": "pass")"));
+  EXPECT_EQ(diagnostic.expectations.find("E")->experiment.has_value(), false);
+}
+
+TEST(ScenarioContentTest, RunsOfExperimentsThatContradictThemselvesAreRefused) {
+  const struct {
+    const char* name;
+    const char* entries;
+    const char* problem;
+  } kRows[] = {
+      {"parameters of a diagnostic", R"("verdict": "pass", "parameters": {})",
+       "expect.E: only a run of an experiment has parameters; name the \"experiment\"."},
+      {"images of a diagnostic", R"("verdict": "pass", "images": 1)",
+       "expect.E: only a run of an experiment has images; name the \"experiment\"."},
+      {"a judgement", R"("experiment": "X", "verdict": "fail")",
+       "expect.E: nobody judges an experiment that is run alone: it passes or ends in an error."},
+      {"images of an error", R"("experiment": "X", "verdict": "error", "images": 1)",
+       "expect.E: only the verdict \"pass\" has images."},
+      {"a parameter that is no number", R"("experiment": "X", "verdict": "pass", "parameters": {"p": "5"})",
+       "expect.E.parameters.p: must be a number from -1.7976931348623157e+308 to 1.7976931348623157e+308, not \"5\"."},
+      {"a negative count of images", R"("experiment": "X", "verdict": "pass", "images": -1)",
+       "expect.E.images: must be an integer from 0 to 1000000000, not -1."},
+      {"an experiment without a name", R"("experiment": "", "verdict": "pass")",
+       "expect.E.experiment: must be a string that is not empty, not \"\"."},
+  };
+  for (const auto& row : kRows) EXPECT_EQ(problemOf(withExpectedEntries(row.entries)), row.problem) << row.name;
+}
+
+}  // namespace
+}  // namespace quazor

@@ -1,0 +1,23 @@
+#include "backends/simulated/scenario/scenario_parts.h"
+
+#include <charconv>
+#include <system_error>
+
+namespace quazor {
+
+FaultError readError(const JsonCursor& cursor) {
+  cursor.allowKeys({"domain", "code", "message"});
+  return {cursor.at("domain").text(), cursor.at("code").integer(), cursor.at("message").text()};
+}
+
+std::uint64_t readNumberKey(const std::string& key, const std::string& what, std::uint64_t highest,
+                            const JsonCursor& entry) {
+  std::uint64_t number = 0;
+  const auto [end, problem] = std::from_chars(key.data(), key.data() + key.size(), number);
+  const bool fits =
+      problem == std::errc() && end == key.data() + key.size() && number <= highest && key == std::to_string(number);
+  if (!fits) entry.fail("the key must be the number of " + what + ", from 0 to " + std::to_string(highest) + ".");
+  return number;
+}
+
+}  // namespace quazor

@@ -1,0 +1,360 @@
+#include "backends/simulated/time/virtual_scheduler.h"
+
+#include "backends/simulated/time/simulation_stall.h"
+
+#include <gmock/gmock.h>
+#include <gtest/gtest.h>
+
+#include <algorithm>
+#include <chrono>
+#include <limits>
+#include <memory>
+#include <set>
+#include <string>
+#include <vector>
+
+namespace quazor {
+namespace {
+
+using namespace std::chrono_literals;
+using ::testing::ElementsAre;
+using ::testing::HasSubstr;
+using ::testing::UnorderedElementsAre;
+using Words = std::vector<std::string>;
+
+// Chooses as told, then always the first; keeps how many things there were to choose from.
+class ScriptedChooser final : public Chooser {
+ public:
+  explicit ScriptedChooser(std::vector<std::size_t> script = {}) : script_(std::move(script)) {}
+
+  std::size_t choose(std::size_t count) override {
+    counts.push_back(count);
+    return counts.size() <= script_.size() ? script_[counts.size() - 1] : 0;
+  }
+
+  std::vector<std::size_t> counts;
+
+ private:
+  std::vector<std::size_t> script_;
+};
+
+class VirtualSchedulerTest : public ::testing::Test {
+ protected:
+  Task say(std::string word) {
+    return [this, word = std::move(word)] { words_.push_back(word); };
+  }
+
+  VirtualScheduler scheduler_{std::make_shared<ScriptedChooser>()};
+  Words words_;
+};
+
+TEST_F(VirtualSchedulerTest, TimeBeginsAtZeroAndStandsStillUntilSomethingBlocks) {
+  const auto lane = scheduler_.makeLane();
+  scheduler_.submit(lane, say("task"));
+  scheduler_.submitAt(1s, lane, say("delayed"));
+  EXPECT_EQ(scheduler_.now(), 0s);
+  EXPECT_TRUE(words_.empty());
+}
+
+TEST_F(VirtualSchedulerTest, TimeJumpsToWhatIsDueNext) {
+  const auto lane = scheduler_.makeLane();
+  std::vector<std::chrono::nanoseconds> times;
+  for (const auto due : {3s, 1s, 2s}) scheduler_.submitAt(due, lane, [&] { times.push_back(scheduler_.now()); });
+  scheduler_.blockUntil(10s, "the test");
+  EXPECT_THAT(times, ElementsAre(1s, 2s, 3s));
+  EXPECT_EQ(scheduler_.now(), 10s);
+}
+
+TEST_F(VirtualSchedulerTest, TheMainFlowGoesOnAsSoonAsItIsChosen) {
+  const auto lane = scheduler_.makeLane();
+  scheduler_.submitAt(1s, lane, say("due at the same time"));
+  scheduler_.blockUntil(1s, "the test");
+  EXPECT_TRUE(words_.empty());
+  scheduler_.blockUntil(2s, "the test");
+  EXPECT_THAT(words_, ElementsAre("due at the same time"));
+}
+
+TEST_F(VirtualSchedulerTest, TasksDueAtOneTimeKeepTheOrderOfTheirSubmission) {
+  const auto lane = scheduler_.makeLane();
+  for (const char* word : {"a", "b", "c"}) scheduler_.submitAt(1s, lane, say(word));
+  scheduler_.blockUntil(2s, "the test");
+  EXPECT_THAT(words_, ElementsAre("a", "b", "c"));
+}
+
+TEST_F(VirtualSchedulerTest, ADueTimeThatHasComeIsNoDelay) {
+  const auto lane = scheduler_.makeLane();
+  scheduler_.blockUntil(5s, "the test");
+  scheduler_.submit(lane, say("first"));
+  scheduler_.submitAt(5s, lane, say("now"));
+  scheduler_.submitAt(1s, lane, say("in the past"));
+  scheduler_.blockUntil(5s + 1ns, "the test");
+  EXPECT_THAT(words_, ElementsAre("first", "now", "in the past"));
+}
+
+TEST_F(VirtualSchedulerTest, DueTimesSaturateAndTheLastOneNeverComes) {
+  constexpr auto kMax = std::chrono::nanoseconds::max();
+  EXPECT_EQ(scheduler_.after(-1s), 0s);
+  EXPECT_EQ(scheduler_.after(1s), 1s);
+  EXPECT_EQ(scheduler_.after(kMax), kMax);
+  scheduler_.blockUntil(kMax - 5ns, "the test");
+  EXPECT_EQ(scheduler_.after(4ns), kMax - 1ns);
+  EXPECT_EQ(scheduler_.after(5ns), kMax);
+  EXPECT_EQ(scheduler_.after(6ns), kMax);
+  EXPECT_EQ(scheduler_.after(kMax), kMax);
+  EXPECT_EQ(scheduler_.after(std::chrono::nanoseconds::min()), kMax - 5ns);
+
+  scheduler_.submitAt(kMax, scheduler_.makeLane(), say("never"));
+  scheduler_.blockUntil(kMax - 1ns, "the test");
+  EXPECT_THROW(scheduler_.blockUntil(kMax, "the end of time"), SimulationStall);
+  EXPECT_TRUE(words_.empty());
+}
+
+TEST_F(VirtualSchedulerTest, ALaneWaitsForItsTaskThatBlocksAndOthersDoNot) {
+  const auto one = scheduler_.makeLane();
+  const auto other = scheduler_.makeLane();
+  scheduler_.submit(one, [&] {
+    words_.push_back("one begins");
+    scheduler_.blockUntil(2s, "the task");
+    words_.push_back("one ends");
+  });
+  scheduler_.submit(one, say("next of one"));
+  scheduler_.submitAt(1s, other, say("other"));
+  scheduler_.blockUntil(3s, "the test");
+  EXPECT_THAT(words_, ElementsAre("one begins", "other", "one ends", "next of one"));
+}
+
+TEST_F(VirtualSchedulerTest, AWaitThatWasBegunEarlierMayEndEarlier) {
+  const auto one = scheduler_.makeLane();
+  const auto other = scheduler_.makeLane();
+  scheduler_.submit(one, [&] {
+    scheduler_.blockUntil(1s, "the short wait");
+    words_.push_back("short");
+  });
+  scheduler_.submit(other, [&] {
+    scheduler_.blockUntil(5s, "the long wait");
+    words_.push_back("long");
+  });
+  scheduler_.blockUntil(2s, "the test");
+  EXPECT_THAT(words_, ElementsAre("short"));
+  scheduler_.blockUntil(6s, "the test");
+  EXPECT_THAT(words_, ElementsAre("short", "long"));
+}
+
+TEST_F(VirtualSchedulerTest, ATaskIsDestroyedWhenItHasRunAndBeforeTheNextStarts) {
+  const auto lane = scheduler_.makeLane();
+  struct Says {
+    Words& words;
+    ~Says() { words.push_back("destroyed"); }
+  };
+  scheduler_.submit(lane, [this, says = std::make_unique<Says>(Says{words_})] { words_.push_back("runs"); });
+  words_.clear();  // of the temporary above
+  scheduler_.submit(lane, say("next"));
+  scheduler_.blockUntil(1s, "the test");
+  EXPECT_THAT(words_, ElementsAre("runs", "destroyed", "next"));
+}
+
+TEST_F(VirtualSchedulerTest, DroppingWhatIsDelayedLeavesWhatIsDueAndOtherLanes) {
+  const auto lane = scheduler_.makeLane();
+  const auto other = scheduler_.makeLane();
+  const auto token = std::make_shared<int>();
+  scheduler_.submit(lane, say("due"));
+  scheduler_.submitAt(1s, lane, [this, token] { words_.push_back("delayed"); });
+  scheduler_.submitAt(1s, other, say("of another lane"));
+  scheduler_.dropDelayed(*lane);
+  EXPECT_EQ(token.use_count(), 1);
+  scheduler_.blockUntil(2s, "the test");
+  EXPECT_THAT(words_, ElementsAre("due", "of another lane"));
+}
+
+TEST_F(VirtualSchedulerTest, AStallSaysWhatWasWaitedForAndWhen) {
+  scheduler_.blockUntil(1500ms, "the test");
+  try {
+    scheduler_.blockUntil([] { return false; }, "a lamp is to light up");
+    FAIL() << "the wait returned";
+  } catch (const SimulationStall& stall) {
+    EXPECT_STREQ(stall.what(), "The simulated phone waits for ever: a lamp is to light up, at 1.5 s of virtual time.");
+  }
+}
+
+TEST_F(VirtualSchedulerTest, AWaitEndsWhenALaterTaskMakesItsConditionHold) {
+  const auto lane = scheduler_.makeLane();
+  bool lit = false;
+  scheduler_.submitAt(7s, lane, [&] { lit = true; });
+  scheduler_.blockUntil([&] { return lit; }, "a lamp is to light up");
+  EXPECT_EQ(scheduler_.now(), 7s);
+}
+
+TEST_F(VirtualSchedulerTest, AWaitWithADueTimeEndsWhenItsConditionHoldsOrWithTheTime) {
+  bool lit = false;
+  const auto lane = scheduler_.makeLane();
+  scheduler_.submitAt(3s, lane, [&lit] { lit = true; });
+  scheduler_.blockUntil([&lit] { return lit; }, 2s, "a lamp is to light up");
+  EXPECT_EQ(scheduler_.now(), 2s);
+  EXPECT_FALSE(lit);
+  scheduler_.blockUntil([&lit] { return lit; }, 10s, "a lamp is to light up");
+  EXPECT_EQ(scheduler_.now(), 3s);
+  EXPECT_THROW(scheduler_.blockUntil([] { return false; }, VirtualScheduler::kNever, "a lamp is to light up"),
+               SimulationStall);
+}
+
+TEST_F(VirtualSchedulerTest, ATaskIsToldItsLaneAndTheMainFlowHasNone) {
+  const auto first = scheduler_.makeLane();
+  const auto second = scheduler_.makeLane();
+  std::vector<std::shared_ptr<VirtualScheduler::Lane>> lanes;
+  const auto tellLane = [&] { lanes.push_back(scheduler_.currentLane()); };
+  scheduler_.submit(first, [&] {
+    tellLane();
+    scheduler_.blockUntil(1s, "the task");
+    tellLane();
+  });
+  scheduler_.submitAt(1s, second, tellLane);
+  scheduler_.blockUntil(2s, "the test");
+  EXPECT_THAT(lanes, UnorderedElementsAre(first, first, second));
+  EXPECT_EQ(lanes.front(), first);
+  EXPECT_EQ(scheduler_.currentLane(), nullptr);
+}
+
+TEST_F(VirtualSchedulerTest, WhatATaskThrowsComesOutOfTheMainFlowsWaitAndTheLaneGoesOn) {
+  const auto lane = scheduler_.makeLane();
+  scheduler_.submit(lane, [] { throw std::runtime_error("broken"); });
+  scheduler_.submit(lane, say("next"));
+  EXPECT_THROW(scheduler_.blockUntil(1s, "the test"), std::runtime_error);
+  scheduler_.blockUntil(1s, "the test");
+  scheduler_.blockUntil(2s, "the test");
+  EXPECT_THAT(words_, ElementsAre("next"));
+}
+
+TEST_F(VirtualSchedulerTest, DiscardingDestroysPendingTasksAndThoseThatTheyLeaveBehind) {
+  const auto lane = scheduler_.makeLane();
+  const auto token = std::make_shared<int>();
+  struct SubmitsWhenDestroyed {
+    VirtualScheduler& scheduler;
+    std::shared_ptr<VirtualScheduler::Lane> lane;
+    std::shared_ptr<int> token;
+    ~SubmitsWhenDestroyed() {
+      scheduler.submit(lane, [token = token] {});
+    }
+  };
+  auto leaves = std::make_unique<SubmitsWhenDestroyed>(SubmitsWhenDestroyed{scheduler_, lane, token});
+  scheduler_.discardPending();  // what the temporary left
+  scheduler_.submit(lane, [token] {});
+  scheduler_.submitAt(1h, lane, [leaves = std::move(leaves)] {});
+  EXPECT_EQ(token.use_count(), 3);
+  scheduler_.discardPending();
+  EXPECT_EQ(token.use_count(), 1);
+}
+
+TEST_F(VirtualSchedulerTest, DiscardingUnwindsATaskThatBlocks) {
+  const auto lane = scheduler_.makeLane();
+  struct Says {
+    Words& words;
+    ~Says() { words.push_back("unwound"); }
+  };
+  scheduler_.submit(lane, [&] {
+    const Says says{words_};
+    try {
+      scheduler_.blockUntil([] { return false; }, "a lamp is to light up");
+    } catch (const SimulationStall& stall) {
+      EXPECT_THAT(stall.what(), HasSubstr("a lamp is to light up"));
+      words_.push_back("stalled");
+    }
+    EXPECT_THROW(scheduler_.blockUntil(1h, "another wait"), SimulationStall);
+  });
+  scheduler_.blockUntil(1s, "the test");
+  EXPECT_TRUE(words_.empty());
+  scheduler_.discardPending();
+  EXPECT_THAT(words_, ElementsAre("stalled", "unwound"));
+}
+
+TEST_F(VirtualSchedulerTest, AStallLeavesBlockedTasksToBeDiscardedWithTheScheduler) {
+  auto scheduler = std::make_unique<VirtualScheduler>(std::make_shared<ScriptedChooser>());
+  const auto lane = scheduler->makeLane();
+  const auto token = std::make_shared<int>();
+  scheduler->submit(
+      lane, [&scheduler = *scheduler, token] { scheduler.blockUntil([] { return false; }, "a lamp is to light up"); });
+  EXPECT_THROW(scheduler->blockUntil([] { return false; }, "another lamp is to light up"), SimulationStall);
+  EXPECT_EQ(token.use_count(), 2);
+  scheduler.reset();
+  EXPECT_EQ(token.use_count(), 1);
+}
+
+TEST(VirtualSchedulerChoices, AChoiceThatThereIsNotIsRefused) {
+  VirtualScheduler scheduler(std::make_shared<ScriptedChooser>(std::vector<std::size_t>{2}));
+  for (int i = 0; i < 2; ++i) scheduler.submit(scheduler.makeLane(), [] {});
+  EXPECT_THROW(scheduler.blockUntil(1s, "the test"), std::out_of_range);
+}
+
+TEST(VirtualSchedulerChoices, WithOneThingToDoTheChooserIsNotAsked) {
+  const auto chooser = std::make_shared<ScriptedChooser>();
+  VirtualScheduler scheduler(chooser);
+  const auto lane = scheduler.makeLane();
+  for (int i = 0; i < 3; ++i) scheduler.submit(lane, [] {});
+  scheduler.blockUntil(1s, "the test");
+  EXPECT_TRUE(chooser->counts.empty());
+}
+
+// Two lanes of two tasks each, and the main flow that waits for both.
+Words runOfTwoLanes(const std::shared_ptr<Chooser>& chooser) {
+  VirtualScheduler scheduler(chooser);
+  Words words;
+  int left = 4;
+  for (const char* lane : {"a", "b"}) {
+    const auto made = scheduler.makeLane();
+    for (const char* number : {"1", "2"}) {
+      scheduler.submit(made, [&words, &left, word = std::string(lane) + number] {
+        words.push_back(word);
+        --left;
+      });
+    }
+  }
+  scheduler.blockUntil([&] { return left == 0; }, "the tasks");
+  return words;
+}
+
+TEST(VirtualSchedulerChoices, ReplayingPrefixesOfChoicesReachesEveryInterleaving) {
+  std::set<Words> reached;
+  std::vector<std::vector<std::size_t>> open{{}};
+  int runs = 0;
+  while (!open.empty()) {
+    const std::vector<std::size_t> prefix = open.back();
+    open.pop_back();
+    const auto chooser = std::make_shared<ScriptedChooser>(prefix);
+    reached.insert(runOfTwoLanes(chooser));
+    ++runs;
+    for (std::size_t at = prefix.size(); at < chooser->counts.size(); ++at) {
+      for (std::size_t choice = 1; choice < chooser->counts[at]; ++choice) {
+        std::vector<std::size_t> next = prefix;
+        next.resize(at, 0);
+        next.push_back(choice);
+        open.push_back(next);
+      }
+    }
+  }
+  EXPECT_EQ(runs, 6);  // the ways to merge two sequences of two
+  EXPECT_EQ(reached.size(), 6U);
+  for (const Words& words : reached) {
+    EXPECT_LT(std::ranges::find(words, "a1"), std::ranges::find(words, "a2"));
+    EXPECT_LT(std::ranges::find(words, "b1"), std::ranges::find(words, "b2"));
+  }
+}
+
+TEST(VirtualSchedulerChoices, OneSeedIsOneOrderAndSeedsDiffer) {
+  std::set<Words> reached;
+  for (std::uint64_t seed = 0; seed < 64; ++seed) {
+    const Words words = runOfTwoLanes(std::make_shared<SeededChooser>(seed));
+    EXPECT_EQ(words, runOfTwoLanes(std::make_shared<SeededChooser>(seed)));
+    reached.insert(words);
+  }
+  EXPECT_EQ(reached.size(), 6U);
+}
+
+TEST(VirtualSchedulerChoices, OtherTasksMayRunBeforeAWaitReturnsThatNeedNotBlock) {
+  VirtualScheduler scheduler(std::make_shared<ScriptedChooser>(std::vector<std::size_t>{1}));
+  bool ran = false;
+  scheduler.submit(scheduler.makeLane(), [&] { ran = true; });
+  scheduler.blockUntil([] { return true; }, "nothing");
+  EXPECT_TRUE(ran);
+}
+
+}  // namespace
+}  // namespace quazor

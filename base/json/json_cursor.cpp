@@ -1,0 +1,145 @@
+#include "base/json/json_cursor.h"
+
+#include <algorithm>
+#include <numeric>
+
+namespace quazor {
+namespace {
+
+using Json = nlohmann::ordered_json;
+
+std::string described(const Json& value) {
+  switch (value.type()) {
+    case Json::value_t::object: return "an object";
+    case Json::value_t::array: return "an array";
+    default: return value.dump();
+  }
+}
+
+// How many characters have to be inserted, deleted or replaced to make one text of the other (Levenshtein 1966).
+std::size_t editDistance(std::string_view a, std::string_view b) {
+  std::vector<std::size_t> row(b.size() + 1);  // distances of a's beginning to all beginnings of b
+  std::iota(row.begin(), row.end(), std::size_t{0});
+  for (std::size_t i = 0; i < a.size(); ++i) {
+    std::size_t diagonal = std::exchange(row[0], i + 1);
+    for (std::size_t j = 0; j < b.size(); ++j) {
+      const std::size_t replaced = diagonal + (a[i] == b[j] ? 0 : 1);
+      diagonal = row[j + 1];
+      row[j + 1] = std::min({replaced, row[j] + 1, diagonal + 1});
+    }
+  }
+  return row.back();
+}
+
+}  // namespace
+
+std::string inQuotes(std::string_view name) { return Json(name).dump(); }
+
+std::string suggestion(std::string_view name, std::span<const std::string_view> names) {
+  if (names.empty()) return ".";
+  const auto distance = [name](std::string_view candidate) { return editDistance(name, candidate); };
+  const std::string_view nearest = *std::ranges::min_element(names, {}, distance);
+  if (distance(nearest) * 3 <= std::max(name.size(), nearest.size()))
+    return "; did you mean " + inQuotes(nearest) + "?";
+  std::string known;
+  for (const std::string_view candidate : names) known += (known.empty() ? "" : ", ") + inQuotes(candidate);
+  return "; known are " + known + ".";
+}
+
+void JsonCursor::fail(const std::string& sentence) const { throw JsonProblem(path_, sentence); }
+
+void JsonCursor::failType(const std::string& expected) const {
+  fail("must be " + expected + ", not " + described(*value_) + ".");
+}
+
+const Json& JsonCursor::object() const {
+  if (!value_->is_object()) failType("an object");
+  return *value_;
+}
+
+void JsonCursor::allowKeys(std::initializer_list<std::string_view> keys) const {
+  for (const auto& [key, value] : object().items()) {
+    if (std::ranges::find(keys, key) != keys.end()) continue;
+    throw JsonProblem(path_, "there is no key " + inQuotes(key) + suggestion(key, keys), jsonPath(path_, key));
+  }
+}
+
+JsonCursor JsonCursor::at(std::string_view key) const {
+  if (std::optional<JsonCursor> entry = find(key)) return *std::move(entry);
+  fail("the key " + inQuotes(key) + " is missing.");
+}
+
+std::optional<JsonCursor> JsonCursor::find(std::string_view key) const {
+  const auto entry = object().find(key);
+  if (entry == value_->end()) return std::nullopt;
+  return JsonCursor(*entry, jsonPath(path_, key));
+}
+
+std::vector<std::pair<std::string, JsonCursor>> JsonCursor::entries() const {
+  std::vector<std::pair<std::string, JsonCursor>> entries;
+  for (const auto& [key, value] : object().items()) {
+    entries.emplace_back(key, JsonCursor(value, jsonPath(path_, key)));
+  }
+  return entries;
+}
+
+std::vector<JsonCursor> JsonCursor::elements() const {
+  if (!value_->is_array()) failType("an array");
+  std::vector<JsonCursor> elements;
+  for (const Json& value : *value_) elements.push_back(JsonCursor(value, jsonPath(path_, elements.size())));
+  return elements;
+}
+
+bool JsonCursor::boolean() const {
+  if (!value_->is_boolean()) failType("true or false");
+  return value_->get<bool>();
+}
+
+std::string JsonCursor::text() const {
+  if (!value_->is_string() || value_->get_ref<const std::string&>().empty()) failType("a string that is not empty");
+  return value_->get<std::string>();
+}
+
+std::int64_t JsonCursor::integer() const {
+  const bool fits = value_->is_number_integer() &&
+                    (!value_->is_number_unsigned() || std::in_range<std::int64_t>(value_->get<std::uint64_t>()));
+  if (!fits) failType("a signed 64-bit integer");
+  return value_->get<std::int64_t>();
+}
+
+std::uint64_t JsonCursor::integer(std::uint64_t lowest, std::uint64_t highest) const {
+  // A number that was read from a text is unsigned unless it is negative.
+  const bool fits =
+      value_->is_number_unsigned() && value_->get<std::uint64_t>() >= lowest && value_->get<std::uint64_t>() <= highest;
+  if (!fits) failType("an integer from " + std::to_string(lowest) + " to " + std::to_string(highest));
+  return value_->get<std::uint64_t>();
+}
+
+double JsonCursor::number(double lowest, double highest) const {
+  const bool fits = value_->is_number() && value_->get<double>() >= lowest && value_->get<double>() <= highest;
+  if (!fits) failType("a number from " + Json(lowest).dump() + " to " + Json(highest).dump());
+  return value_->get<double>();
+}
+
+double JsonCursor::positiveNumber(double highest) const {
+  const bool fits = value_->is_number() && value_->get<double>() > 0 && value_->get<double>() <= highest;
+  if (!fits) failType("a number above 0 and at most " + Json(highest).dump());
+  return value_->get<double>();
+}
+
+Value JsonCursor::scalar() const {
+  if (value_->is_string()) return Value(value_->get<std::string>());
+  if (value_->is_boolean()) return Value(value_->get<bool>());
+  if (value_->is_number_float()) return Value(value_->get<double>());
+  if (!value_->is_number()) failType("a number, a string, true or false");
+  const bool isLarge = value_->is_number_unsigned() && !std::in_range<std::int64_t>(value_->get<std::uint64_t>());
+  return isLarge ? Value(value_->get<std::uint64_t>()) : Value(value_->get<std::int64_t>());
+}
+
+std::string JsonCursor::oneOf(std::span<const std::string_view> names, std::string_view what) const {
+  std::string name = text();
+  if (std::ranges::find(names, name) != names.end()) return name;
+  fail(inQuotes(name) + " is not " + std::string(what) + suggestion(name, names));
+}
+
+}  // namespace quazor

@@ -1,0 +1,80 @@
+// JsonCursor: a value of a JSON document that knows where it stands.
+#pragma once
+
+#include "base/json/json_file.h"
+#include "contract/value.h"
+
+#include <cstddef>
+#include <cstdint>
+#include <initializer_list>
+#include <optional>
+#include <span>
+#include <string>
+#include <string_view>
+#include <utility>
+#include <vector>
+
+namespace quazor {
+
+// Reads with checks: every wrong type, unknown key and number out of range throws JsonProblem with "PATH: " and one
+// sentence that says what is wrong and what would be right.
+//
+// Borrows the document. Not synchronised.
+class JsonCursor {
+ public:
+  explicit JsonCursor(const nlohmann::ordered_json& document) : JsonCursor(document, "") {}
+
+  const std::string& path() const { return path_; }
+  bool isNull() const { return value_->is_null(); }
+  bool isBoolean() const { return value_->is_boolean(); }
+  bool isString() const { return value_->is_string(); }
+  bool isObject() const { return value_->is_object(); }
+  bool isArray() const { return value_->is_array(); }
+
+  // Of objects. `keys` are all the keys there may be.
+  void allowKeys(std::initializer_list<std::string_view> keys) const;
+  // The entry, which must be there.
+  JsonCursor at(std::string_view key) const;
+  // The entry, where it is there.
+  std::optional<JsonCursor> find(std::string_view key) const;
+  // All entries, in the document's order.
+  std::vector<std::pair<std::string, JsonCursor>> entries() const;
+
+  // Of arrays.
+  std::vector<JsonCursor> elements() const;
+
+  // Of values.
+  bool boolean() const;
+  // Not empty.
+  std::string text() const;
+  std::int64_t integer() const;
+  std::uint64_t integer(std::uint64_t lowest, std::uint64_t highest) const;
+  double number(double lowest, double highest) const;
+  // Above 0.
+  double positiveNumber(double highest) const;
+  // A number, a boolean or a string; whole numbers are signed integers where they fit one.
+  Value scalar() const;
+  // One of `names`; `what` says what they are: "an action".
+  std::string oneOf(std::span<const std::string_view> names, std::string_view what) const;
+
+  [[noreturn]] void fail(const std::string& sentence) const;
+  // "must be `expected`, not ...": what stands there is told.
+  [[noreturn]] void failType(const std::string& expected) const;
+
+ private:
+  JsonCursor(const nlohmann::ordered_json& value, std::string path) : value_(&value), path_(std::move(path)) {}
+
+  const nlohmann::ordered_json& object() const;
+
+  const nlohmann::ordered_json* value_;
+  std::string path_;
+};
+
+// `"name"`, as a document has it.
+std::string inQuotes(std::string_view name);
+
+// `; did you mean "near"?` when one of `names` is near enough to `name` to be meant, else `; known are "a", "b".`: the
+// end of a sentence about a name that does not exist.
+std::string suggestion(std::string_view name, std::span<const std::string_view> names);
+
+}  // namespace quazor

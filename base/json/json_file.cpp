@@ -1,0 +1,223 @@
+#include "base/json/json_file.h"
+
+#include <algorithm>
+#include <array>
+#include <cstddef>
+#include <cstdint>
+#include <fstream>
+#include <iterator>
+#include <optional>
+#include <set>
+#include <system_error>
+#include <vector>
+
+namespace quazor {
+namespace {
+
+using Json = nlohmann::ordered_json;
+
+constexpr std::size_t kLargestFile = 16U << 20;  // a device may have no end
+// Deeper than any document. Bounds the recursion of whoever walks the document.
+constexpr std::size_t kDeepest = 32;
+
+// The length of the UTF-8 sequence at the start of `text`; 0 when it is none (RFC 3629).
+std::size_t sequenceLength(std::string_view text) {
+  const auto at = [&](std::size_t i) { return i < text.size() ? static_cast<unsigned char>(text[i]) : 0U; };
+  const auto continues = [&](std::size_t i) { return (at(i) & 0xC0U) == 0x80U; };
+  const unsigned first = at(0);
+  if (first < 0x80) return 1;
+  if (first >= 0xC2 && first <= 0xDF) return continues(1) ? 2 : 0;
+  if (first >= 0xE0 && first <= 0xEF) {
+    const bool overlong = first == 0xE0 && at(1) < 0xA0;
+    const bool surrogate = first == 0xED && at(1) > 0x9F;
+    return continues(1) && continues(2) && !overlong && !surrogate ? 3 : 0;
+  }
+  if (first >= 0xF0 && first <= 0xF4) {
+    const bool overlong = first == 0xF0 && at(1) < 0x90;
+    const bool beyond = first == 0xF4 && at(1) > 0x8F;
+    return continues(1) && continues(2) && continues(3) && !overlong && !beyond ? 4 : 0;
+  }
+  return 0;
+}
+
+std::optional<std::size_t> firstInvalidUtf8(std::string_view text) {
+  for (std::size_t at = 0; at < text.size();) {
+    const std::size_t length = sequenceLength(text.substr(at));
+    if (length == 0) return at;
+    at += length;
+  }
+  return std::nullopt;
+}
+
+std::string lineAt(std::string_view text, std::size_t offset) {
+  const std::string_view before = text.substr(0, offset);
+  return std::to_string(std::ranges::count(before, '\n') + 1);
+}
+
+// How far the parser has come: it counts the ends of lines before the character that it took last, which is the last
+// one of what it tells of, or one beyond where that is a number.
+struct Progress {
+  std::size_t line = 1;
+  bool tookLineEnd = false;
+};
+
+// Hands a text to the parser, and tells the progress.
+class CountingIterator {
+ public:
+  using iterator_category = std::input_iterator_tag;
+  using value_type = char;
+  using difference_type = std::ptrdiff_t;
+  using pointer = const char*;
+  using reference = const char&;
+
+  CountingIterator(const char* at, Progress* progress) : at_(at), progress_(progress) {}
+
+  reference operator*() const { return *at_; }
+  CountingIterator& operator++() {
+    if (progress_->tookLineEnd) ++progress_->line;
+    progress_->tookLineEnd = *at_++ == '\n';
+    return *this;
+  }
+  bool operator==(const CountingIterator& other) const { return at_ == other.at_; }
+
+ private:
+  const char* at_;
+  Progress* progress_;
+};
+
+// Follows the parser through the document, to know where it stands and which keys an object has had.
+class Tracker {
+ public:
+  explicit Tracker(std::string name) : name_(std::move(name)) {}
+
+  // Parses, and calls `visit` wherever path() and line() may have changed.
+  template <typename Visit>
+  Json parse(std::string_view text, const Visit& visit) {
+    const auto follow = [&](int, Json::parse_event_t event, Json& parsed) {
+      take(event, parsed);
+      visit();
+      return true;
+    };
+    return Json::parse(CountingIterator(text.data(), &progress_),
+                       CountingIterator(text.data() + text.size(), &progress_), follow);
+  }
+
+  std::size_t line() const { return progress_.line; }
+  // "NAME:LINE: PATH: " or, in the document as a whole, "NAME:LINE: ".
+  std::string place() const {
+    const std::string where = path();
+    return name_ + ":" + std::to_string(line()) + ": " + (where.empty() ? "" : where + ": ");
+  }
+
+  std::string path() const {
+    std::string path;
+    for (const Container& container : open_) {
+      if (container.isArray && container.elements > 0) path = jsonPath(path, container.elements - 1);
+      if (!container.isArray && !container.key.empty()) path = jsonPath(path, container.key);
+    }
+    return path;
+  }
+
+ private:
+  struct Container {
+    bool isArray = false;
+    std::size_t elements = 0;  // begun so far, of an array
+    std::string key;           // the present one, of an object
+    std::set<std::string> keys;
+  };
+
+  void take(Json::parse_event_t event, const Json& parsed) {
+    switch (event) {
+      case Json::parse_event_t::object_start: open(false); break;
+      case Json::parse_event_t::array_start: open(true); break;
+      case Json::parse_event_t::object_end:
+      case Json::parse_event_t::array_end: open_.pop_back(); break;
+      case Json::parse_event_t::key: key(parsed.get<std::string>()); break;
+      case Json::parse_event_t::value: element(); break;
+    }
+  }
+  void element() {
+    if (!open_.empty() && open_.back().isArray) ++open_.back().elements;
+  }
+  void open(bool isArray) {
+    element();
+    if (open_.size() == kDeepest) {
+      throw JsonProblem(name_ + ":" + std::to_string(line()) + ": the document is nested more than " +
+                        std::to_string(kDeepest) + " deep.");
+    }
+    open_.push_back({isArray, 0, {}, {}});
+  }
+  void key(const std::string& key) {
+    Container& object = open_.back();
+    object.key.clear();
+    if (!object.keys.insert(key).second) {
+      throw JsonProblem(place() + "the key " + Json(key).dump() + " stands twice; leave one of the two.");
+    }
+    object.key = key;
+  }
+
+  std::string name_;
+  Progress progress_;
+  std::vector<Container> open_;
+};
+
+// The parser's own words for what it met, without its preamble.
+std::string complaintOf(const Json::parse_error& error) {
+  const std::string text = error.what();
+  const std::size_t dash = text.find(" - ");
+  return dash == std::string::npos ? text : text.substr(dash + 3);
+}
+
+}  // namespace
+
+std::string jsonPath(const std::string& path, std::string_view key) {
+  return path.empty() ? std::string(key) : path + "." + std::string(key);
+}
+
+std::string jsonPath(const std::string& path, std::size_t index) { return path + "[" + std::to_string(index) + "]"; }
+
+Json parseJson(std::string_view text, const std::string& name) {
+  if (const std::optional<std::size_t> invalid = firstInvalidUtf8(text)) {
+    throw JsonProblem(name + ":" + lineAt(text, *invalid) + ": this is not UTF-8; save the file in that encoding.");
+  }
+  Tracker tracker(name);
+  try {
+    return tracker.parse(text, [] {});
+  } catch (const Json::parse_error& error) {
+    const std::size_t offset = error.byte == 0 ? 0 : error.byte - 1;
+    throw JsonProblem(name + ":" + lineAt(text, offset) + ": this is not JSON: " + complaintOf(error) + ".");
+  } catch (const Json::out_of_range&) {
+    throw JsonProblem(tracker.place() + "the number is too large; a double must hold it.");
+  }
+}
+
+std::size_t lineOfPath(std::string_view text, const std::string& path) {
+  Tracker tracker("");
+  std::size_t line = 0;
+  tracker.parse(text, [&] {
+    if (line == 0 && tracker.path() == path) line = tracker.line();
+  });
+  return std::max(line, std::size_t{1});
+}
+
+std::string readTextFile(const std::filesystem::path& file) {
+  const std::string name = file.string();
+  std::error_code failure;
+  const std::filesystem::file_status status = std::filesystem::status(file, failure);
+  if (status.type() == std::filesystem::file_type::not_found) throw JsonProblem(name + ": there is no such file.");
+  if (std::filesystem::is_directory(status)) throw JsonProblem(name + ": this is a directory, not a file.");
+  std::ifstream stream(file, std::ios::binary);
+  if (!stream) throw JsonProblem(name + ": the file cannot be opened; check its permissions.");
+  std::string text;
+  std::array<char, 65536> piece;  // read() notes a failure where iterators throw
+  while (stream.read(piece.data(), piece.size()) || stream.gcount() > 0) {
+    text.append(piece.data(), static_cast<std::size_t>(stream.gcount()));
+    if (text.size() > kLargestFile) throw JsonProblem(name + ": the file is larger than 16 MiB.");
+  }
+  if (stream.bad()) throw JsonProblem(name + ": the file cannot be read.");
+  return text;
+}
+
+Json readJsonFile(const std::filesystem::path& file) { return parseJson(readTextFile(file), file.string()); }
+
+}  // namespace quazor

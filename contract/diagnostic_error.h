@@ -1,0 +1,74 @@
+// DiagnosticError: how every operation that can fail tells its failure.
+#pragma once
+
+#include "contract/contract.h"
+#include "contract/message_format.h"
+#include "contract/value.h"
+
+#include <cstdint>
+#include <string>
+#include <string_view>
+#include <utility>
+
+namespace QUAZOR_CONTRACT {
+
+// The domains of the errors that the host knows.
+inline constexpr std::string_view QZErrorDomain = "QZErrorDomain";
+inline constexpr std::string_view QZCapturePlugInErrorDomain = "QZCapturePlugInErrorDomain";
+inline constexpr std::string_view QZTelemonErrorDomain = "QZTelemonErrorDomain";
+inline constexpr std::string_view QZNimbeImageExperimentErrorDomain = "QZNimbeImageExperimentErrorDomain";
+
+// The keys of an error's user info.
+inline constexpr std::string_view localizedDescriptionKey = "localized-description";  // the message, a string
+inline constexpr std::string_view underlyingErrorKey = "underlying-error";            // the error that caused this one
+
+// A failure: a domain, a code that is unique in it, and a dictionary that holds the message and, where another error
+// caused this one, that error. Immutable; any thread may read it.
+//
+// Failure itself is told by an operation's return value, never by its error: an out-argument may hold an error after
+// a success, and may be empty after a failure.
+class QUAZOR_EXPORT DiagnosticError {
+ public:
+  DiagnosticError(std::string_view domain, std::int64_t code, Dictionary userInfo);
+
+  const std::string& domain() const { return domain_; }
+  std::int64_t code() const { return code_; }
+  const Dictionary& userInfo() const { return userInfo_; }
+
+  // The message; an error that was made without one describes itself by domain and code.
+  std::string localizedDescription() const;
+  // The error that caused this one, or null.
+  DiagnosticErrorPtr underlyingError() const;
+  // "message", "code", "domain" and, only where there is one, "underlying-error" with that error's own dictionary.
+  Dictionary dictionaryRepresentation() const;
+
+ private:
+  std::string domain_;
+  std::int64_t code_;
+  Dictionary userInfo_;
+};
+
+// An error with the given message and, unless it is null, the error that caused it.
+QUAZOR_EXPORT DiagnosticErrorPtr errorWithMessage(std::string_view domain, std::int64_t code, std::string message,
+                                                  DiagnosticErrorPtr underlying);
+
+// An error whose message is built from a format (contract/message_format.h); it never has an underlying error.
+template <class... Arguments>
+DiagnosticErrorPtr makeError(std::string_view domain, std::int64_t code, MessageFormat<Arguments...> format,
+                             const Arguments&... arguments) {
+  return errorWithMessage(domain, code, formatMessage(format, arguments...), nullptr);
+}
+
+// Stores an error where the caller asked for one; null empties what the caller had there.
+inline void storeError(DiagnosticErrorPtr* out, DiagnosticErrorPtr error) {
+  if (out != nullptr) *out = std::move(error);
+}
+
+// Builds an error and stores it, both only where the caller asked for one. `underlying` may be null.
+template <class... Arguments>
+void fail(DiagnosticErrorPtr* out, std::string_view domain, std::int64_t code, const DiagnosticErrorPtr& underlying,
+          MessageFormat<Arguments...> format, const Arguments&... arguments) {
+  if (out != nullptr) *out = errorWithMessage(domain, code, formatMessage(format, arguments...), underlying);
+}
+
+}  // namespace QUAZOR_CONTRACT

@@ -1,0 +1,140 @@
+// OrderedMap: string keys to values, kept in the order of their insertion.
+#pragma once
+
+#include "contract/contract.h"
+
+#include <cstddef>
+#include <cstdint>
+#include <functional>
+#include <initializer_list>
+#include <string>
+#include <string_view>
+#include <utility>
+#include <vector>
+
+namespace QUAZOR_CONTRACT {
+
+// A dictionary that iterates in insertion order and finds a key in constant time on average.
+//
+// Setting a key that is already there replaces its value and keeps its place. A looked-up pointer is valid until the
+// next set() or erase(). Looking a key up never inserts it. Copies are independent. Not synchronised: any number of
+// readers, or one writer.
+template <class T>
+class OrderedMap {
+ public:
+  using Entry = std::pair<std::string, T>;
+  using const_iterator = typename std::vector<Entry>::const_iterator;
+
+  OrderedMap() = default;
+  OrderedMap(std::initializer_list<Entry> entries) {
+    for (const Entry& entry : entries) set(entry.first, entry.second);
+  }
+
+  void set(std::string_view key, T value) {
+    if (Entry* entry = findEntry(key)) {
+      entry->second = std::move(value);
+      return;
+    }
+    entries_.emplace_back(std::string(key), std::move(value));
+    if (entries_.size() > kScanLimit || !slots_.empty()) addToIndex(entries_.size() - 1);
+  }
+
+  // The value under `key`, or null.
+  const T* find(std::string_view key) const { return valueOf(const_cast<OrderedMap*>(this)->findEntry(key)); }
+  T* find(std::string_view key) { return valueOf(findEntry(key)); }
+  bool contains(std::string_view key) const { return find(key) != nullptr; }
+
+  // Removes `key`; true when it was there. Linear in the number of entries.
+  bool erase(std::string_view key) {
+    Entry* entry = findEntry(key);
+    if (entry == nullptr) return false;
+    entries_.erase(entries_.begin() + (entry - entries_.data()));
+    slots_.clear();
+    if (entries_.size() > kScanLimit) rebuildIndex(entries_.size());
+    return true;
+  }
+
+  // Makes room for `count` entries in all.
+  void reserve(std::size_t count) {
+    entries_.reserve(count);
+    if (count > kScanLimit && slots_.size() < count * 2) rebuildIndex(count);
+  }
+  std::size_t size() const { return entries_.size(); }
+  bool empty() const { return entries_.empty(); }
+  const_iterator begin() const { return entries_.begin(); }
+  const_iterator end() const { return entries_.end(); }
+
+  // Equal when both hold the same keys with equal values, in whatever order.
+  friend bool operator==(const OrderedMap& a, const OrderedMap& b) {
+    if (a.size() != b.size()) return false;
+    for (const Entry& entry : a) {
+      const T* other = b.find(entry.first);
+      if (other == nullptr || !(*other == entry.second)) return false;
+    }
+    return true;
+  }
+
+ private:
+  // Up to this many entries a scan beats hashing, and most dictionaries are this small.
+  static constexpr std::size_t kScanLimit = 8;
+
+  // One place of the open-addressing index: an entry's position plus one (0 is a free place), and enough of its hash
+  // to pass over most strangers without touching their keys.
+  struct Slot {
+    std::uint32_t place = 0;
+    std::uint32_t hash = 0;
+  };
+
+  static T* valueOf(Entry* entry) { return entry == nullptr ? nullptr : &entry->second; }
+
+  static std::uint32_t hashOf(std::string_view key) {
+    const std::uint64_t hash = std::hash<std::string_view>{}(key);
+    return static_cast<std::uint32_t>(hash ^ (hash >> 32));
+  }
+
+  Entry* findEntry(std::string_view key) {
+    if (slots_.empty()) {
+      for (Entry& entry : entries_) {
+        if (entry.first == key) return &entry;
+      }
+      return nullptr;
+    }
+    const std::uint32_t hash = hashOf(key);
+    const std::size_t mask = slots_.size() - 1;
+    for (std::size_t at = hash & mask; slots_[at].place != 0; at = (at + 1) & mask) {
+      if (slots_[at].hash != hash) continue;
+      Entry& entry = entries_[slots_[at].place - 1];
+      if (entry.first == key) return &entry;
+    }
+    return nullptr;
+  }
+
+  void addToIndex(std::size_t position) {
+    if (slots_.size() < entries_.size() * 2) {
+      rebuildIndex(entries_.size() * 2);
+    } else {
+      place(position);
+    }
+  }
+
+  // An index with room for `count` entries.
+  void rebuildIndex(std::size_t count) {
+    std::size_t size = kScanLimit * 4;
+    while (size < count * 2) size *= 2;
+    slots_.assign(size, Slot{});
+    for (std::size_t i = 0; i < entries_.size(); ++i) place(i);
+  }
+
+  void place(std::size_t position) {
+    const std::uint32_t hash = hashOf(entries_[position].first);
+    const std::size_t mask = slots_.size() - 1;
+    std::size_t at = hash & mask;
+    while (slots_[at].place != 0) at = (at + 1) & mask;
+    slots_[at] = Slot{static_cast<std::uint32_t>(position + 1), hash};
+  }
+
+  std::vector<Entry> entries_;
+  std::vector<Slot> slots_;  // empty, or a power of two and at most half full; never empty beyond kScanLimit entries
+};
+
+}  // namespace QUAZOR_CONTRACT

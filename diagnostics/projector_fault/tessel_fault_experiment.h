@@ -1,0 +1,99 @@
+// QZTesselFaultExperiment: streams the infrared camera of the depth module with the structured-light projector firing.
+#pragma once
+
+#include "contract/diagnostic_contract.h"
+#include "diagnostics/projector_fault/tessel_frame_description.h"
+#include "platform/pixel_buffer.h"
+#include "platform/platform.h"
+
+#include <atomic>
+#include <cstdint>
+#include <memory>
+#include <mutex>
+#include <string>
+#include <utility>
+
+namespace quazor {
+
+// Counts the frames that arrive, checks that each one was lit, and ends with the first lit frame whose number is at
+// least the number asked for, with the first frame that fails, or at the timeout. The result holds the frame count,
+// the stream's error counters, and by how much every fault channel counted up meanwhile.
+//
+// Must be owned by a std::shared_ptr: its stream's handlers hold it weakly, its tasks in part strongly. The last
+// reference may go on any thread, one of its own queues' included.
+//
+// Threads: the host's calls come on the host's thread. Frames and events come on the capture service's threads and are
+// taken in on the receiving queue, where they are counted; lit or not is found out on the processing queue, where
+// the timeout runs too. Whichever ends the stream does so under the experiment's lock, once.
+class QZTesselFaultExperiment final : public QZExperiment,
+                                      public QZTeardown,
+                                      public std::enable_shared_from_this<QZTesselFaultExperiment> {
+ public:
+  // For the stream of the front infrared camera, or of another capture port.
+  explicit QZTesselFaultExperiment(Platform platform = installedPlatform());
+  explicit QZTesselFaultExperiment(std::string port, Platform platform = installedPlatform());
+
+  const std::string& port() const { return _port; }
+  void setPort(std::string port) { _port = std::move(port); }
+  std::uint64_t formatIndex() const { return _formatIndex; }
+  void setFormatIndex(std::uint64_t index) { _formatIndex = index; }
+  const std::shared_ptr<CaptureDevice>& device() const { return _device; }
+  void setDevice(std::shared_ptr<CaptureDevice> device) { _device = std::move(device); }
+  const std::shared_ptr<CaptureStream>& stream() const { return _stream; }
+  void setStream(std::shared_ptr<CaptureStream> stream) { _stream = std::move(stream); }
+
+  QZDescription experimentDescription() const override;
+  // Takes "frameCount" and "timeout", in seconds; fails with QZErrorDomain code 5 when one is negative.
+  bool setupWithParameters(const Dictionary& parameters, QZDiagnosticHost* host, DiagnosticErrorPtr* error) override;
+  // Blocks until the stream has ended. Fails with codes of QZCapturePlugInErrorDomain, and with QZTelemonErrorDomain
+  // code 100. May store an error and succeed all the same.
+  std::unique_ptr<QZExperimentResult> run(DiagnosticErrorPtr* error) override;
+  // Invalidates the capture device; fails with QZCapturePlugInErrorDomain code 200.
+  bool teardown(DiagnosticErrorPtr* error) override;
+
+ private:
+  struct Examination;
+
+  bool _openStream(DiagnosticErrorPtr* error);
+  bool _findStream(const CaptureStreams& streams, DiagnosticErrorPtr* error);
+  bool _configureStream(DiagnosticErrorPtr* error);
+  Dictionary _handlers();
+  std::shared_ptr<const ReportSnapshot> _subscribe(std::shared_ptr<const ReportChannelSet>& channels,
+                                                   DiagnosticErrorPtr* error);
+  void _scheduleTimeout();
+  std::unique_ptr<QZExperimentResult> _finish(const ReportChannelSet& channels, const ReportSnapshot& baseline,
+                                              DiagnosticErrorPtr* error);
+  std::unique_ptr<QZExperimentResult> _buildResult() const;
+
+  // Any thread. Takes over the caller's reference to the buffer, and gives it back only when the frame is handed on to
+  // the processing queue.
+  void _handlePixelBuffer(PixelBuffer& buffer, MediaTime time);
+  // Any thread.
+  void _handleEvent(std::int32_t event, MediaTime time, const Value* info);
+  // On the receiving queue.
+  static void _takeIn(std::shared_ptr<QZTesselFaultExperiment> self, PixelBuffer& buffer, MediaTime time);
+  // On the processing queue.
+  void _examine(const QZTesselFrameDescription& frame, std::uint64_t number);
+  // Any thread. Ends the stream, the first time it is called; `error` may be null.
+  void _stopWithError(const DiagnosticErrorPtr& error);
+
+  Platform _platform;
+  std::string _port;
+  std::uint64_t _formatIndex = 0;
+  std::shared_ptr<CaptureDevice> _device;
+  std::shared_ptr<CaptureStream> _stream;
+  std::shared_ptr<Semaphore> _done_semaphore;  // signalled once, when the stream has been stopped
+  DiagnosticErrorPtr _error;                   // what ended the stream; written before the signal, read after it
+  std::optional<Value> _errorCounters;         // read at the stop; as _error
+  std::shared_ptr<const ReportSnapshot> _telemonDelta;
+  std::atomic<std::uint64_t> _frameCount{0};  // written on the receiving queue only
+  RecordPool _records;                        // of frames that wait for their examination
+  std::shared_ptr<SerialQueue> _receivingQueue;
+  std::shared_ptr<SerialQueue> _processingQueue;
+  std::recursive_mutex _mutex;     // held for all of _stopWithError
+  std::atomic<bool> _stop{false};  // once true, stays true; set under _mutex, read without it
+  std::uint64_t _stopCount = 0;    // the frame number that ends the run
+  double _timeout = 0;             // seconds
+};
+
+}  // namespace quazor

@@ -1,0 +1,20 @@
+// QZTesselTelemonAnalysis: every expected channel of the depth camera module must be there, and count nothing.
+#pragma once
+
+#include "contract/diagnostic_contract.h"
+
+#include <memory>
+
+namespace quazor {
+
+// Gives one result per expected name, in the order of expectedTelemonNames(), limited to 0; other measurements are
+// left alone.
+class QZTesselTelemonAnalysis final : public QZAnalysis {
+ public:
+  QZDescription analysisDescription() const override;
+  // Fails with QZErrorDomain code 6 at the first name without a measurement.
+  std::unique_ptr<QZAnalysisResult> analyzeExperimentResult(const QZExperimentResult& result,
+                                                            DiagnosticErrorPtr* error) override;
+};
+
+}  // namespace quazor

@@ -1,0 +1,25 @@
+// QZTesselTelemonExperiment: samples the event channels of the depth camera module once.
+#pragma once
+
+#include "contract/diagnostic_contract.h"
+#include "platform/platform.h"
+
+#include <memory>
+
+namespace quazor {
+
+// The result holds one measurement per channel, its count in events under the channel's name; of two channels with one
+// name the later one stands. No channels give an empty result.
+class QZTesselTelemonExperiment final : public QZExperiment {
+ public:
+  explicit QZTesselTelemonExperiment(Platform platform = installedPlatform());
+
+  QZDescription experimentDescription() const override;
+  // Fails with QZTelemonErrorDomain code 100.
+  std::unique_ptr<QZExperimentResult> run(DiagnosticErrorPtr* error) override;
+
+ private:
+  Platform _platform;
+};
+
+}  // namespace quazor

@@ -1,0 +1,446 @@
+#include "host/cli/command_line.h"
+
+#include "base/text/nearest_name.h"
+#include "contract/contract.h"
+#include "host/device/phone.h"
+#include "host/text/table.h"
+
+#include <CLI/CLI.hpp>
+
+#include <algorithm>
+#include <charconv>
+#include <memory>
+#include <system_error>
+#include <utility>
+
+namespace quazor {
+
+namespace {
+
+constexpr const char* kExamples = R"(Examples:
+  quazor list                                     what there is
+  quazor describe 'CameraSync*'                   what the diagnostics do, and their parameters
+  quazor run --all                                all of them, on the healthy phone
+  quazor run CameraSyncDiagnostic.Back --set duration=10
+  quazor run --all --phone my_phone.json --format json --output report.json
+  quazor phone probe                              what this machine has for a binding, and a first one
+  quazor run --all --phone linux:board.json       on this machine's own cameras, sensors and counters
+  quazor run --all --record run.jsonl --output junit:report.xml --output ocp:report.jsonl
+  quazor run --only failed                        what did not pass the last time
+  quazor experiment CameraSyncExperiment.Back     what it measures, without judging it
+  quazor verify run.jsonl                         does every verdict follow from what was measured?
+  quazor analyze run.jsonl --set analysis.frameCount=60
+  quazor explain QZCapturePlugInErrorDomain:206   what an error means, and what to do next
+  quazor selftest                                 do the diagnostics find what they are for?
+)";
+
+constexpr const char* kExitCodes = R"(Exit codes:
+  0    all diagnostics passed, all experiments returned a result
+  1    a diagnostic failed its limits; verify, diff or selftest found something
+  2    a diagnostic or experiment ended in an error
+  64   the command line is wrong
+  66   a plug-in, scenario, binding, profile or record cannot be read or loaded
+  70   quazor itself failed
+  73   a report or record cannot be written
+  130  interrupted)";
+
+// What a plug-in's process may have by default: more than any diagnostic needs, less than a bench's machine has.
+constexpr std::uint64_t kMebibyte = 1024 * 1024;
+constexpr std::uint64_t kUsualMebibytes = 4096;
+
+// The texts of a command line as CLI11 collects them, before they are checked.
+struct RawOptions {
+  std::vector<std::string> names;
+  std::vector<std::string> plugins;
+  std::vector<std::string> settings;
+  std::vector<std::string> parameterFiles;
+  std::vector<std::string> records;
+  std::vector<std::string> outputs;
+  std::vector<std::string> deadlines;
+  std::string profile;
+  std::string phone;
+  std::string record;
+  std::string only;
+  std::string of;
+  std::string seed = "0";
+  std::string seeds = "3";
+  std::string memory;
+  std::string logLevel;
+  std::string format = "text";
+  bool all = false;
+  bool realTime = false;
+  bool systemLog = false;
+  bool inProcess = false;
+};
+
+void addRepeatable(CLI::App& command, const std::string& name, std::vector<std::string>& texts,
+                   const std::string& description, const std::string& form) {
+  // One text each time: what follows it is a diagnostic's name.
+  command.add_option(name, texts, description)->allow_extra_args(false)->type_name(form);
+}
+
+void addNames(CLI::App& command, std::vector<std::string>& names, const std::string& whose) {
+  command.add_option("NAME", names, whose + " name, or a pattern (*, ?, [...]) for several")->type_name("");
+}
+
+// CLI11 takes a name that is all in brackets for a list of names; with a mark before it, it stays a pattern.
+constexpr char kMark = '\x01';
+
+std::vector<std::string> marked(std::vector<std::string> arguments) {
+  for (std::string& argument : arguments) {
+    if (argument.starts_with('[') && argument.ends_with(']')) argument.insert(argument.begin(), kMark);
+  }
+  return arguments;
+}
+
+void removeMarks(RawOptions& raw) {
+  const auto removeMark = [](std::string& text) {
+    if (text.starts_with(kMark)) text.erase(0, 1);
+  };
+  for (std::vector<std::string>* texts :
+       {&raw.names, &raw.plugins, &raw.settings, &raw.parameterFiles, &raw.records, &raw.outputs, &raw.deadlines}) {
+    std::for_each(texts->begin(), texts->end(), removeMark);
+  }
+  for (std::string* text : {&raw.profile, &raw.phone, &raw.record, &raw.of, &raw.seed, &raw.seeds, &raw.memory}) {
+    removeMark(*text);
+  }
+}
+
+void addPlugins(CLI::App& command, RawOptions& raw) {
+  addRepeatable(command, "--plugin", raw.plugins, "Load this plug-in, not the installed one; may be repeated", "FILE");
+}
+
+void addReportOptions(CLI::App& command, RawOptions& raw, const std::vector<std::string>& formats) {
+  std::string list;
+  for (const std::string& format : formats) list += (list.empty() ? "" : ", ") + format;
+  command.add_option("--format", raw.format, "The form of the report: " + list)
+      ->type_name("FORMAT")
+      ->check(CLI::IsMember(formats));
+  const bool several = formats.size() > 2;
+  addRepeatable(command, "--output", raw.outputs,
+                several ? "Write the report to this file; with a format before it, a further report; may be repeated"
+                        : "Write the report to this file",
+                several ? "[FORMAT:]FILE" : "FILE");
+}
+
+void addProcessOptions(CLI::App& command, RawOptions& raw) {
+  command.add_flag("--in-process", raw.inProcess,
+                   "Load plug-ins into quazor itself, for a debugger: without deadlines, and a crash ends all");
+  addRepeatable(
+      command, "--deadline", raw.deadlines,
+      "End a stage (load, describe, setup, run, teardown, analyse), or any, that takes longer; may be repeated",
+      "[STAGE=]SECONDS");
+  command.add_option("--memory", raw.memory, "The most memory of a plug-in's process; 4096 by default")
+      ->type_name("MEBIBYTES|none");
+}
+
+void addParameterOptions(CLI::App& command, RawOptions& raw) {
+  command.add_option("--profile", raw.profile, "Take parameter values from this file; none: from no file")
+      ->type_name("FILE");
+  addRepeatable(command, "--parameters", raw.parameterFiles,
+                "Take further values from this file, of a profile's form; may be repeated", "FILE");
+  addRepeatable(command, "--set", raw.settings,
+                "Set a parameter, wherever it is declared; may be repeated. The variable QUAZOR_SET may hold such "
+                "settings too, separated by spaces. --set wins over it, it over --parameters, that over the profile",
+                "[experiment.|analysis.]NAME=VALUE");
+}
+
+void addLogOptions(CLI::App& command, RawOptions& raw) {
+  command
+      .add_option("--log-level", raw.logLevel,
+                  "Show log lines up to this level (error, default, debug) on the standard error stream, and keep them "
+                  "in reports; without it, error is shown and default kept")
+      ->type_name("LEVEL")
+      ->check(CLI::IsMember({"error", "default", "debug"}));
+  command.add_flag("--system-log", raw.systemLog,
+                   "Send log lines to the system's journal too, or to syslog where there is none");
+}
+
+void addRecord(CLI::App& command, RawOptions& raw) {
+  command.add_option("--record", raw.record, "Keep everything that happens in this file, while it happens")
+      ->type_name("FILE");
+}
+
+void addRunOptions(CLI::App& command, RawOptions& raw, const std::string& what) {
+  command.add_flag("--all", raw.all, "Run all " + what);
+  command
+      .add_option("--phone", raw.phone,
+                  "Run on the phone of this scenario, or on this machine by this binding: a file, or the name of an "
+                  "installed one")
+      ->type_name("[linux:]FILE");
+  command.add_flag("--realtime", raw.realTime, "Let the phone's time pass as real time does");
+  command.add_option("--seed", raw.seed, "Choose the order of what happens at the same time; 0 by default")
+      ->type_name("N");
+  addRecord(command, raw);
+  addLogOptions(command, raw);
+}
+
+void addRecords(CLI::App& command, RawOptions& raw, int count, const std::string& what) {
+  command.add_option("RECORD", raw.records, what)->type_name("")->required()->expected(count);
+}
+
+std::uint64_t parseWhole(const char* option, const std::string& text, std::uint64_t least, std::uint64_t most) {
+  std::uint64_t number = 0;
+  const auto [end, error] = std::from_chars(text.data(), text.data() + text.size(), number);
+  if (error != std::errc() || end != text.data() + text.size() || number < least || number > most) {
+    throw Refusal(ExitCode::kUsage, std::string(option) + " '" + text + "': it must be a whole number from " +
+                                        std::to_string(least) + " to " + std::to_string(most));
+  }
+  return number;
+}
+
+std::optional<std::uint64_t> memoryOf(const std::string& text) {
+  if (text == "none") return std::nullopt;
+  if (!text.empty()) return parseWhole("--memory", text, 1, UINT64_MAX / kMebibyte) * kMebibyte;
+#if defined(__SANITIZE_ADDRESS__) || defined(__SANITIZE_THREAD__)
+  return std::nullopt;  // the sanitizers' shadow takes more than there is
+#else
+  return kUsualMebibytes * kMebibyte;
+#endif
+}
+
+std::optional<LogLevel> logLevelOf(const std::string& text) {
+  if (text == "error") return LogLevel::kError;
+  if (text == "default") return LogLevel::kDefault;
+  if (text == "debug") return LogLevel::kDebug;
+  return std::nullopt;
+}
+
+// CLI11 takes an option with an empty text as one that was given; none of ours has a use for it.
+void refuseEmpty(const CLI::App& command, const char* option) {
+  const CLI::Option* const given = command.get_option_no_throw(option);
+  if (given == nullptr) return;
+  const std::vector<std::string>& texts = given->results();
+  if (std::find(texts.begin(), texts.end(), std::string()) == texts.end()) return;
+  throw Refusal(ExitCode::kUsage, std::string(option) + ": its value is empty");
+}
+
+Command commandOf(const std::string& name) {
+  const auto found = std::find(std::begin(kCommandNames), std::end(kCommandNames), name);
+  return static_cast<Command>(found - std::begin(kCommandNames));
+}
+
+// Only a run can be written in several formats at once.
+ReportOptions reportOf(const RawOptions& raw, bool isOfRun) {
+  ReportOptions report;
+  report.format = *formatNamed(raw.format);
+  for (const std::string& text : raw.outputs) {
+    OutputRequest output = isOfRun ? parseOutput(text, report.format) : OutputRequest{report.format, text};
+    if (output.file.empty()) throw Refusal(ExitCode::kUsage, "--output '" + text + "': the file's name is missing");
+    if (output.file != text) {
+      report.outputs.push_back(std::move(output));
+    } else if (report.output.empty()) {
+      report.output = output.file;
+    } else {
+      throw Refusal(ExitCode::kUsage,
+                    "--output '" + report.output.string() + "' and --output '" + text +
+                        (isOfRun ? "': write the format before further files, as in --output junit:FILE"
+                                 : "': one file is all that is written"));
+    }
+  }
+  return report;
+}
+
+// This machine is what it is: nothing chooses its time or its order of events.
+void checkPhone(const CLI::App& command, const std::filesystem::path& phone) {
+  const std::optional<std::filesystem::path> binding = bindingNamed(phone);
+  if (!binding) return;
+  if (binding->empty()) throw Refusal(ExitCode::kUsage, "--phone 'linux:': the binding's file or name is missing");
+  for (const char* option : {"--seed", "--realtime"}) {
+    if (command.get_option(option)->count() == 0) continue;
+    throw Refusal(ExitCode::kUsage, std::string(option) + " is for simulated phones; --phone '" + phone.string() +
+                                        "' is this machine, in real time, in the order in which things happen");
+  }
+}
+
+// Diagnostics or experiments: names, --all or --only failed.
+void checkNames(const Options& options, const std::string& what) {
+  const int ways = (options.names.empty() ? 0 : 1) + (options.all ? 1 : 0) + (options.onlyFailed ? 1 : 0);
+  if (ways == 0) {
+    throw Refusal(ExitCode::kUsage, "name the " + what + " to run, or give --all; 'quazor list' shows what there is");
+  }
+  if (ways > 1 && !options.onlyFailed) throw Refusal(ExitCode::kUsage, "give either names of " + what + " or --all");
+  if (ways > 1) throw Refusal(ExitCode::kUsage, "give --only failed without names and without --all");
+  if (!options.onlyFailed && !options.failedOf.empty()) {
+    throw Refusal(ExitCode::kUsage, "--of is for --only failed");
+  }
+}
+
+Options optionsOf(const CLI::App& command, const RawOptions& raw) {
+  for (const char* option :
+       {"--plugin", "--output", "--profile", "--parameters", "--phone", "--record", "--of", "RECORD", "--memory"}) {
+    refuseEmpty(command, option);
+  }
+  Options options;
+  options.command = commandOf(command.get_name());
+  options.names = raw.names;
+  options.all = raw.all;
+  options.plugins.assign(raw.plugins.begin(), raw.plugins.end());
+  options.parameterFiles.assign(raw.parameterFiles.begin(), raw.parameterFiles.end());
+  options.records.assign(raw.records.begin(), raw.records.end());
+  options.record = raw.record;
+  options.onlyFailed = raw.only == "failed";
+  options.failedOf = raw.of;
+  options.phone = raw.phone;
+  checkPhone(command, options.phone);
+  options.realTime = raw.realTime;
+  options.inProcess = raw.inProcess;
+  options.seed = parseWhole("--seed", raw.seed, 0, UINT64_MAX);
+  options.seeds = parseWhole("--seeds", raw.seeds, 1, 1'000'000);
+  options.memory = memoryOf(raw.memory);
+  for (const std::string& text : raw.settings) options.settings.push_back(parseSetting(text));
+  for (const std::string& text : raw.deadlines) options.deadlines.push_back(parseDeadline(text));
+  options.logLevel = logLevelOf(raw.logLevel);
+  options.systemLog = raw.systemLog;
+  const bool isOfRun = options.command == Command::kRun || options.command == Command::kExperiment ||
+                       options.command == Command::kAnalyze;
+  options.report = reportOf(raw, isOfRun);
+  options.report.shownLog = options.logLevel.value_or(LogLevel::kError);
+  options.withoutProfile = raw.profile == "none";
+  if (!options.withoutProfile) options.profile = raw.profile;
+  if (options.command == Command::kRun) checkNames(options, "diagnostics");
+  if (options.command == Command::kExperiment) checkNames(options, "experiments");
+  return options;
+}
+
+std::vector<std::string> commandNames() { return {std::begin(kCommandNames), std::end(kCommandNames)}; }
+
+// A first word that is no command gets a better answer than CLI11's.
+void refuseUnknownCommand(const std::vector<std::string>& arguments) {
+  if (arguments.empty() || arguments.front().starts_with('-')) return;
+  const std::string& word = arguments.front();
+  const std::vector<std::string> commands = commandNames();
+  if (std::find(commands.begin(), commands.end(), word) != commands.end()) return;
+  std::string list;
+  for (const std::string& command : commands) list += (list.empty() ? "" : ", ") + command;
+  throw Refusal(ExitCode::kUsage,
+                "there is no command '" + word + "'" + didYouMean(word, commands) + "; the commands are " + list);
+}
+
+void declareLookingCommands(CLI::App& app, RawOptions& raw) {
+  CLI::App& list = *app.add_subcommand("list", "List the diagnostics, and the experiments that none of them uses");
+  addPlugins(list, raw);
+  addReportOptions(list, raw, {"text", "json"});
+  addProcessOptions(list, raw);
+  CLI::App& describe = *app.add_subcommand("describe", "Describe diagnostics or experiments, and their parameters");
+  addNames(describe, raw.names, "A diagnostic's or experiment's");
+  describe.get_option("NAME")->required();
+  addPlugins(describe, raw);
+  addReportOptions(describe, raw, {"text", "json"});
+  addParameterOptions(describe, raw);
+  addProcessOptions(describe, raw);
+}
+
+void declareRunningCommands(CLI::App& app, RawOptions& raw) {
+  const std::vector<std::string> formats = {"text", "json", "csv", "ocp", "junit"};
+  CLI::App& run = *app.add_subcommand("run", "Run diagnostics: measure, and judge by limits");
+  addNames(run, raw.names, "A diagnostic's");
+  run.add_option("--only", raw.only,
+                 "failed: run what did not pass in the last run, or in the record of --of, as it was run then")
+      ->type_name("failed")
+      ->check(CLI::IsMember({"failed"}));
+  run.add_option("--of", raw.of, "The record that --only means")->type_name("RECORD");
+  addRunOptions(run, raw, "diagnostics");
+  CLI::App& experiment = *app.add_subcommand("experiment", "Run experiments alone: measure, and judge nothing");
+  addNames(experiment, raw.names, "An experiment's");
+  addRunOptions(experiment, raw, "experiments");
+  CLI::App& analyze = *app.add_subcommand("analyze", "Analyse a record's results again, and judge them anew");
+  addRecords(analyze, raw, 1, "The record");
+  addRecord(analyze, raw);
+  addLogOptions(analyze, raw);
+  for (CLI::App* const command : {&run, &experiment, &analyze}) {
+    addPlugins(*command, raw);
+    addReportOptions(*command, raw, formats);
+    addParameterOptions(*command, raw);
+    addProcessOptions(*command, raw);
+  }
+}
+
+void declareOtherCommands(CLI::App& app, RawOptions& raw) {
+  CLI::App& verify = *app.add_subcommand("verify", "Check that a record's verdicts follow from the rest of it");
+  addRecords(verify, raw, 1, "The record");
+  CLI::App& diff = *app.add_subcommand("diff", "Show what two records tell differently");
+  addRecords(diff, raw, 2, "The two records");
+  CLI::App& explain = *app.add_subcommand("explain", "Explain an error or a diagnostic, and what to do next");
+  explain.add_option("WHAT", raw.names, "A diagnostic's name, an error's CODE or DOMAIN:CODE; without any, all titles")
+      ->type_name("");
+  addReportOptions(explain, raw, {"text", "json"});
+  CLI::App& doctor = *app.add_subcommand("doctor", "Check the installation: plug-ins, profiles, phones, records");
+  addPlugins(doctor, raw);
+  addProcessOptions(doctor, raw);
+  CLI::App& selftest = *app.add_subcommand("selftest", "Run the diagnostics on every installed phone with a fault");
+  addNames(selftest, raw.names, "A phone's");
+  selftest.add_option("--seeds", raw.seeds, "How many orders of events to try; 3 by default")->type_name("N");
+  addPlugins(selftest, raw);
+  addReportOptions(selftest, raw, {"text", "json"});
+  addProcessOptions(selftest, raw);
+  CLI::App& phone = *app.add_subcommand("phone", "Tell what this machine has for a binding, and print a first one");
+  phone.add_option("WHAT", raw.names, "probe")->type_name("")->required()->expected(1)->check(CLI::IsMember({"probe"}));
+  addRepeatable(phone, "--output", raw.outputs, "Write the binding to this file, and print only the rest", "FILE");
+  CLI::App& completion = *app.add_subcommand("completion", "Print the completion for a shell: bash or zsh");
+  completion.add_option("SHELL", raw.names, "bash or zsh")
+      ->type_name("")
+      ->required()
+      ->check(CLI::IsMember({"bash", "zsh"}));
+}
+
+void declareCommands(CLI::App& app, RawOptions& raw) {
+  app.require_subcommand(1);
+  app.footer(std::string(kExamples) + "\n" + kExitCodes);
+  app.set_version_flag("--version",
+                       "quazor " QUAZOR_VERSION ", plug-in contract " + std::to_string(QUAZOR_CONTRACT_VERSION));
+  declareLookingCommands(app, raw);
+  declareRunningCommands(app, raw);
+  declareOtherCommands(app, raw);
+}
+
+}  // namespace
+
+std::vector<OptionSummary> optionsOfCommand(const std::string& command) {
+  CLI::App app;
+  RawOptions raw;
+  declareCommands(app, raw);
+  std::vector<OptionSummary> options;
+  const std::vector<CLI::App*> found =
+      app.get_subcommands([&command](CLI::App* one) { return one->get_name() == command; });
+  if (found.empty()) return options;
+  for (const CLI::Option* const option : std::as_const(*found.front()).get_options()) {
+    if (option->get_lnames().empty()) continue;  // an operand
+    options.push_back({"--" + option->get_lnames().front(), option->get_items_expected_max() > 0});
+  }
+  return options;
+}
+
+std::optional<Options> parseCommandLine(const std::vector<std::string>& arguments, std::ostream& out, std::ostream& err,
+                                        ExitCode* code) {
+  CLI::App app("Hardware diagnostics for a phone's cameras and sensors.", "quazor");
+  RawOptions raw;
+  declareCommands(app, raw);
+  *code = ExitCode::kUsage;
+  if (arguments.empty()) {
+    err << app.help();
+    return std::nullopt;
+  }
+  try {
+    refuseUnknownCommand(arguments);
+    // CLI11 takes them from the back.
+    std::vector<std::string> texts = marked(arguments);
+    std::reverse(texts.begin(), texts.end());
+    app.parse(std::move(texts));
+    removeMarks(raw);
+    *code = ExitCode::kAllPassed;
+    return optionsOf(*app.get_subcommands().front(), raw);
+  } catch (const CLI::Success& answer) {
+    app.exit(answer, out, err);
+    *code = ExitCode::kAllPassed;
+  } catch (const CLI::ParseError& refusal) {
+    err << "quazor: " << printable(refusal.what()) << "\nquazor --help shows how to call it.\n";
+    *code = ExitCode::kUsage;
+  } catch (const Refusal& refusal) {
+    err << "quazor: " << printable(refusal.what()) << '\n';
+    *code = refusal.code();
+  }
+  return std::nullopt;
+}
+
+}  // namespace quazor

@@ -1,0 +1,311 @@
+#include "host/cli/command_line.h"
+
+#include <gmock/gmock.h>
+#include <gtest/gtest.h>
+
+#include <sstream>
+
+namespace quazor {
+namespace {
+
+using testing::ElementsAre;
+using testing::HasSubstr;
+
+struct Parsed {
+  std::optional<Options> options;
+  ExitCode code = ExitCode::kInternal;
+  std::string out;
+  std::string err;
+};
+
+Parsed parse(const std::vector<std::string>& arguments) {
+  Parsed parsed;
+  std::ostringstream out;
+  std::ostringstream err;
+  parsed.options = parseCommandLine(arguments, out, err, &parsed.code);
+  parsed.out = out.str();
+  parsed.err = err.str();
+  return parsed;
+}
+
+TEST(ParseCommandLine, KnowsItsDefaults) {
+  const std::optional<Options> options = parse({"run", "A"}).options;
+  ASSERT_TRUE(options);
+  EXPECT_EQ(options->command, Command::kRun);
+  EXPECT_THAT(options->names, ElementsAre("A"));
+  EXPECT_FALSE(options->all);
+  EXPECT_THAT(options->plugins, ElementsAre());
+  EXPECT_EQ(options->phone, "");
+  EXPECT_FALSE(options->realTime);
+  EXPECT_EQ(options->seed, 0U);
+  EXPECT_TRUE(options->settings.empty());
+  EXPECT_EQ(options->logLevel, std::nullopt);
+  EXPECT_FALSE(options->systemLog);
+  EXPECT_EQ(options->report.format, Format::kText);
+  EXPECT_EQ(options->report.output, "");
+  EXPECT_EQ(options->profile, "");
+  EXPECT_FALSE(options->withoutProfile);
+  EXPECT_TRUE(options->parameterFiles.empty());
+  EXPECT_TRUE(options->records.empty());
+  EXPECT_EQ(options->record, "");
+  EXPECT_FALSE(options->onlyFailed);
+  EXPECT_EQ(options->failedOf, "");
+  EXPECT_TRUE(options->report.outputs.empty());
+  EXPECT_EQ(options->report.shownLog, LogLevel::kError);
+  EXPECT_TRUE(options->deadlines.empty());
+#if !defined(__SANITIZE_ADDRESS__) && !defined(__SANITIZE_THREAD__)
+  EXPECT_EQ(options->memory, std::uint64_t{4096} * 1024 * 1024);
+#endif
+  EXPECT_FALSE(options->inProcess);
+}
+
+TEST(ParseCommandLine, ReadsEveryOption) {
+  const std::optional<Options> options = parse({"run",
+                                                "--plugin",
+                                                "a.so",
+                                                "A",
+                                                "--plugin",
+                                                "b.so",
+                                                "--phone",
+                                                "p",
+                                                "--realtime",
+                                                "--seed",
+                                                "18446744073709551615",
+                                                "--set",
+                                                "x=1",
+                                                "B",
+                                                "--set=analysis.y=2",
+                                                "--log-level",
+                                                "debug",
+                                                "--system-log",
+                                                "--format",
+                                                "json",
+                                                "--output",
+                                                "o",
+                                                "--profile",
+                                                "f",
+                                                "--parameters",
+                                                "g",
+                                                "--parameters=h",
+                                                "--record",
+                                                "r",
+                                                "--output",
+                                                "junit:j",
+                                                "--output",
+                                                "csv:c",
+                                                "--deadline",
+                                                "run=5",
+                                                "--deadline",
+                                                "7",
+                                                "--memory",
+                                                "256",
+                                                "--in-process"})
+                                             .options;
+  ASSERT_TRUE(options);
+  EXPECT_THAT(options->names, ElementsAre("A", "B"));
+  EXPECT_THAT(options->plugins, ElementsAre("a.so", "b.so"));
+  EXPECT_EQ(options->phone, "p");
+  EXPECT_TRUE(options->realTime);
+  EXPECT_EQ(options->seed, UINT64_MAX);
+  ASSERT_EQ(options->settings.size(), 2U);
+  EXPECT_EQ(options->settings[1].half, Half::kAnalysis);
+  EXPECT_EQ(options->logLevel, LogLevel::kDebug);
+  EXPECT_TRUE(options->systemLog);
+  EXPECT_EQ(options->report.shownLog, LogLevel::kDebug);
+  EXPECT_EQ(options->report.format, Format::kJson);
+  EXPECT_EQ(options->report.output, "o");
+  ASSERT_EQ(options->report.outputs.size(), 2U);
+  EXPECT_EQ(options->report.outputs[0].format, Format::kJunit);
+  EXPECT_EQ(options->report.outputs[0].file, "j");
+  EXPECT_EQ(options->report.outputs[1].format, Format::kCsv);
+  EXPECT_EQ(options->profile, "f");
+  EXPECT_THAT(options->parameterFiles, ElementsAre("g", "h"));
+  EXPECT_EQ(options->record, "r");
+  ASSERT_EQ(options->deadlines.size(), 2U);
+  EXPECT_EQ(options->deadlines[0].stage, Stage::kRun);
+  EXPECT_EQ(options->deadlines[1].stage, std::nullopt);
+  EXPECT_EQ(options->memory, std::uint64_t{256} * 1024 * 1024);
+  EXPECT_TRUE(options->inProcess);
+}
+
+TEST(ParseCommandLine, ReadsHowMuchMemoryThereIs) {
+  EXPECT_EQ(parse({"run", "A", "--memory", "none"}).options->memory, std::nullopt);
+  EXPECT_EQ(parse({"list", "--memory", "1"}).options->memory, std::uint64_t{1024} * 1024);
+  EXPECT_EQ(parse({"run", "A", "--memory", "17592186044415"}).options->memory, UINT64_MAX - 1024 * 1024 + 1);
+}
+
+TEST(ParseCommandLine, ReadsTheOptionsOfRecords) {
+  const std::optional<Options> failed = parse({"run", "--only", "failed", "--of", "r"}).options;
+  ASSERT_TRUE(failed);
+  EXPECT_TRUE(failed->onlyFailed);
+  EXPECT_EQ(failed->failedOf, "r");
+  EXPECT_THAT(parse({"verify", "r"}).options->records, ElementsAre("r"));
+  EXPECT_THAT(parse({"diff", "r", "[s]"}).options->records, ElementsAre("r", "[s]"));
+  const std::optional<Options> analyze =
+      parse({"analyze", "r", "--record", "s", "--set", "x=1", "--output", "ocp:o"}).options;
+  ASSERT_TRUE(analyze);
+  EXPECT_THAT(analyze->records, ElementsAre("r"));
+  EXPECT_EQ(analyze->record, "s");
+  EXPECT_EQ(analyze->settings.size(), 1U);
+  EXPECT_EQ(analyze->report.outputs[0].format, Format::kOcp);
+}
+
+TEST(ParseCommandLine, TakesAFormatBeforeAFileOnlyWhereThereAreSeveral) {
+  const std::optional<Options> options = parse({"list", "--format", "json", "--output", "json:o"}).options;
+  ASSERT_TRUE(options);
+  EXPECT_EQ(options->report.output, "json:o");
+  EXPECT_TRUE(options->report.outputs.empty());
+}
+
+TEST(ParseCommandLine, ReadsTheOptionsOfExperiments) {
+  const std::optional<Options> options =
+      parse({"experiment",   "A",        "B*",  "--plugin", "a.so", "--phone",     "p",
+             "--realtime",   "--seed",   "7",   "--set",    "x=1",  "--log-level", "error",
+             "--system-log", "--format", "csv", "--output", "o",    "--profile",   "f"})
+          .options;
+  ASSERT_TRUE(options);
+  EXPECT_EQ(options->command, Command::kExperiment);
+  EXPECT_THAT(options->names, ElementsAre("A", "B*"));
+  EXPECT_THAT(options->plugins, ElementsAre("a.so"));
+  EXPECT_EQ(options->phone, "p");
+  EXPECT_TRUE(options->realTime);
+  EXPECT_EQ(options->seed, 7U);
+  EXPECT_EQ(options->settings.size(), 1U);
+  EXPECT_EQ(options->logLevel, LogLevel::kError);
+  EXPECT_TRUE(options->systemLog);
+  EXPECT_EQ(options->report.format, Format::kCsv);
+  EXPECT_EQ(options->report.output, "o");
+  EXPECT_EQ(options->profile, "f");
+  EXPECT_TRUE(parse({"experiment", "--all"}).options->all);
+}
+
+TEST(ParseCommandLine, KnowsItsCommands) {
+  struct Row {
+    std::vector<std::string> arguments;
+    Command command;
+  };
+  const Row rows[] = {{{"list"}, Command::kList},
+                      {{"describe", "A"}, Command::kDescribe},
+                      {{"run", "A"}, Command::kRun},
+                      {{"experiment", "A"}, Command::kExperiment},
+                      {{"verify", "r"}, Command::kVerify},
+                      {{"analyze", "r"}, Command::kAnalyze},
+                      {{"diff", "r", "s"}, Command::kDiff},
+                      {{"explain", "206"}, Command::kExplain},
+                      {{"doctor"}, Command::kDoctor},
+                      {{"selftest"}, Command::kSelftest},
+                      {{"phone", "probe"}, Command::kPhone},
+                      {{"completion", "bash"}, Command::kCompletion}};
+  EXPECT_EQ(std::size(rows), std::size(kCommandNames));
+  for (const Row& row : rows) {
+    const std::optional<Options> options = parse(row.arguments).options;
+    ASSERT_TRUE(options) << row.arguments[0];
+    EXPECT_EQ(options->command, row.command) << row.arguments[0];
+  }
+}
+
+TEST(ParseCommandLine, TakesPatternsAsTheyAre) {
+  const std::optional<Options> options = parse({"run", "[AB]", "*", "A?"}).options;
+  ASSERT_TRUE(options);
+  EXPECT_THAT(options->names, ElementsAre("[AB]", "*", "A?"));
+}
+
+TEST(ParseCommandLine, TakesNoneForNoProfile) {
+  const std::optional<Options> options = parse({"describe", "A", "--profile", "none"}).options;
+  ASSERT_TRUE(options);
+  EXPECT_TRUE(options->withoutProfile);
+  EXPECT_EQ(options->command, Command::kDescribe);
+}
+
+TEST(ParseCommandLine, RefusesWrongUsage) {
+  struct Row {
+    std::vector<std::string> arguments;
+    const char* problem;
+  };
+  const Row rows[] = {
+      {{"rnu"}, "there is no command 'rnu'; did you mean 'run'?"},
+      {{"fly"}, "there is no command 'fly'; the commands are list, describe, run, experiment"},
+      {{"run"}, "name the diagnostics to run, or give --all"},
+      {{"run", "A", "--all"}, "either names of diagnostics or --all"},
+      {{"experiment"}, "name the experiments to run, or give --all"},
+      {{"experiment", "A", "--all"}, "either names of experiments or --all"},
+      {{"experiment", "A", "--format", "xml"}, "xml"},
+      {{"list", "--format", "csv"}, "--format: csv not in {text,json}"},
+      {{"describe", "A", "--format", "csv"}, "--format: csv not in {text,json}"},
+      {{"describe"}, "NAME"},
+      {{"list", "A"}, "A"},
+      {{"list", "--realtime"}, "--realtime"},
+      {{"run", "A", "--bogus"}, "--bogus"},
+      {{"run", "A", "--seed"}, "--seed"},
+      {{"run", "A", "--seed", ""}, "--seed ''"},
+      {{"run", "A", "--seed", "-1"}, "--seed '-1'"},
+      {{"run", "A", "--seed", "1.5"}, "--seed '1.5'"},
+      {{"run", "A", "--seed", "7x"}, "--seed '7x'"},
+      {{"run", "A", "--seed", "18446744073709551616"}, "a whole number from 0 to 18446744073709551615"},
+      {{"run", "A", "--seed", "1", "--seed", "2"}, "--seed"},
+      {{"run", "A", "--format", "xml"}, "xml"},
+      {{"run", "A", "--log-level", "loud"}, "loud"},
+      {{"run", "A", "--set", "x"}, "it must have the form"},
+      {{"run", "A", "--set", "x=nan"}, "'nan' is not a finite number"},
+      {{"run", "A", "--output", ""}, "--output: its value is empty"},
+      {{"run", "A", "--phone", ""}, "--phone: its value is empty"},
+      {{"run", "A", "--profile", ""}, "--profile: its value is empty"},
+      {{"run", "A", "--plugin", ""}, "--plugin: its value is empty"},
+      {{"run", "A", "--output", "x", "--output", "y"},
+       "--output 'x' and --output 'y': write the format before further files, as in --output junit:FILE"},
+      {{"list", "--output", "x", "--output", "y"}, "--output 'x' and --output 'y': one file is all that is written"},
+      {{"run", "A", "--output", "json:"}, "--output 'json:': the file's name is missing"},
+      {{"run", "A", "--parameters", ""}, "--parameters: its value is empty"},
+      {{"run", "A", "--record", ""}, "--record: its value is empty"},
+      {{"run", "--only", "failed", "--of", ""}, "--of: its value is empty"},
+      {{"verify", ""}, "RECORD: its value is empty"},
+      {{"run", "A", "--memory", ""}, "--memory: its value is empty"},
+      {{"run", "A", "--memory", "0"}, "--memory '0': it must be a whole number from 1 to 17592186044415"},
+      {{"run", "A", "--memory", "17592186044416"}, "--memory '17592186044416'"},
+      {{"run", "A", "--memory", "much"}, "--memory 'much'"},
+      {{"run", "A", "--deadline", "soon"}, "--deadline 'soon': 'soon' is not a number"},
+      {{"run", "A", "--deadline", "runn=5"}, "there is no stage 'runn'"},
+      {{"run", "--only", "passed"}, "--only: passed not in {failed}"},
+      {{"run", "A", "--only", "failed"}, "give --only failed without names and without --all"},
+      {{"run", "--all", "--only", "failed"}, "give --only failed without names and without --all"},
+      {{"run", "A", "--of", "r"}, "--of is for --only failed"},
+      {{"verify"}, "RECORD"},
+      {{"verify", "a", "b"}, "b"},
+      {{"diff", "a"}, "RECORD"},
+      {{"analyze"}, "RECORD"},
+      {{"selftest", "--seeds", "0"}, "--seeds '0': it must be a whole number from 1 to 1000000"},
+      {{"completion", "fish"}, "fish"},
+      {{"verifi"}, "there is no command 'verifi'; did you mean 'verify'?"},
+  };
+  for (const Row& row : rows) {
+    const Parsed parsed = parse(row.arguments);
+    const std::string line = testing::PrintToString(row.arguments);
+    EXPECT_FALSE(parsed.options) << line;
+    EXPECT_EQ(parsed.code, ExitCode::kUsage) << line;
+    EXPECT_EQ(parsed.out, "") << line;
+    EXPECT_THAT(parsed.err, testing::AllOf(testing::StartsWith("quazor: "), HasSubstr(row.problem))) << line;
+  }
+}
+
+TEST(ParseCommandLine, AnswersForHelpAndVersion) {
+  const Parsed help = parse({"--help"});
+  EXPECT_FALSE(help.options);
+  EXPECT_EQ(help.code, ExitCode::kAllPassed);
+  EXPECT_THAT(help.out, testing::AllOf(HasSubstr("quazor run --all"), HasSubstr("130  interrupted")));
+  EXPECT_EQ(help.err, "");
+  EXPECT_THAT(parse({"run", "--help"}).out, testing::AllOf(HasSubstr("--seed"), HasSubstr("--phone")));
+  const Parsed version = parse({"--version"});
+  EXPECT_EQ(version.code, ExitCode::kAllPassed);
+  EXPECT_THAT(version.out, testing::StartsWith("quazor "));
+}
+
+TEST(ParseCommandLine, HelpsWhenCalledWithNothing) {
+  const Parsed parsed = parse({});
+  EXPECT_FALSE(parsed.options);
+  EXPECT_EQ(parsed.code, ExitCode::kUsage);
+  EXPECT_THAT(parsed.err, HasSubstr("Examples:"));
+  EXPECT_EQ(parsed.out, "");
+}
+
+}  // namespace
+}  // namespace quazor

@@ -1,0 +1,59 @@
+#include "host/cli/installation.h"
+
+#include "host/testing/test_directory.h"
+
+#include <gtest/gtest.h>
+
+namespace quazor {
+namespace {
+
+class InstallationTest : public testing::Test {
+ protected:
+  Installation installation() const { return Installation(directory_.path() / "bin" / "quazor"); }
+
+  TestDirectory directory_;
+  const std::filesystem::path prefix_ = directory_.path();
+};
+
+TEST_F(InstallationTest, FindsItsFilesFromThePlaceOfTheProgram) {
+  EXPECT_EQ(installation().defaultPlugin(), prefix_ / QUAZOR_PLUGIN_DIRECTORY / "camera_sensor_diagnostics.so");
+  EXPECT_EQ(installation().defaultProfile(), prefix_ / QUAZOR_DATA_DIRECTORY / "profiles/default.json");
+  EXPECT_EQ(installation().defaultScenario(), prefix_ / QUAZOR_DATA_DIRECTORY / "scenarios/healthy.json");
+  EXPECT_EQ(installation().explanations(), prefix_ / QUAZOR_DATA_DIRECTORY / "explanations");
+}
+
+TEST_F(InstallationTest, TakesThePluginBesideTheProgramWhereNoneIsInstalled) {
+  const std::filesystem::path beside = directory_.write("bin/camera_sensor_diagnostics.so", "");
+  EXPECT_EQ(installation().defaultPlugin(), beside);
+  const std::filesystem::path installed =
+      directory_.write(std::filesystem::path(QUAZOR_PLUGIN_DIRECTORY) / "camera_sensor_diagnostics.so", "");
+  EXPECT_EQ(installation().defaultPlugin(), installed);
+}
+
+TEST_F(InstallationTest, FindsAnInstalledScenarioByItsName) {
+  const std::filesystem::path installed =
+      directory_.write(std::filesystem::path(QUAZOR_DATA_DIRECTORY) / "scenarios/sync/refused.json", "{}");
+  EXPECT_EQ(installation().scenario("sync/refused"), installed);
+}
+
+TEST_F(InstallationTest, FindsInstalledBindingsByTheirNames) {
+  const std::filesystem::path bindings = std::filesystem::path(QUAZOR_DATA_DIRECTORY) / "bindings";
+  const std::filesystem::path installed = directory_.write(bindings / "board.json", "{}");
+  directory_.write(bindings / "binding.schema.json", "{}");
+  EXPECT_EQ(installation().binding("board"), installed);
+  EXPECT_EQ(installation().binding("other"), "other");
+  EXPECT_EQ(installation().bindingNames(), std::vector<std::string>{"board"});
+}
+
+TEST_F(InstallationTest, PrefersAFileOfThatPathToAnInstalledScenario) {
+  const std::filesystem::path file = directory_.write("mine", "{}");
+  EXPECT_EQ(installation().scenario(file), file);
+}
+
+TEST_F(InstallationTest, LeavesAPathThatIsNothingAsItIs) {
+  EXPECT_EQ(installation().scenario("sync/unknown"), "sync/unknown");
+  EXPECT_EQ(installation().scenario("/sync/unknown"), "/sync/unknown");
+}
+
+}  // namespace
+}  // namespace quazor

@@ -1,0 +1,13 @@
+// What a command says that runs nothing.
+#pragma once
+
+#include "host/report/run_report.h"
+
+#include <string>
+
+namespace quazor {
+
+// Writes it to the output file, or else to the console. Throws a Refusal (kCannotWrite) when that fails.
+void writeAnswer(const ReportOptions& report, Console& console, const std::string& answer);
+
+}  // namespace quazor

@@ -1,0 +1,116 @@
+#include "host/command/commands.h"
+
+#include "host/command/answer.h"
+#include "host/command/completion.h"
+#include "host/command/doctor.h"
+#include "host/command/explain_command.h"
+#include "host/command/phone_command.h"
+#include "host/command/record_commands.h"
+#include "host/command/run_command.h"
+#include "host/command/selection.h"
+#include "host/command/selftest_command.h"
+#include "host/plugin/catalogue.h"
+#include "host/record/value_json.h"
+#include "host/report/json_report.h"
+#include "host/report/text_report.h"
+#include "host/text/table.h"
+
+#include <sstream>
+#include <utility>
+
+namespace quazor {
+
+namespace {
+
+// Tells of the plug-ins that could not be loaded, and what that makes of the exit code.
+ExitCode tellFailed(const std::vector<FailedPlugin>& failed, Console& console, ExitCode otherwise) {
+  for (const FailedPlugin& plugin : failed) {
+    console.err << "quazor: " << printable(plugin.error->localizedDescription()) << '\n';
+  }
+  return failed.empty() ? otherwise : ExitCode::kCannotRead;
+}
+
+ExitCode list(const Options& options, const Installation& installation, Console& console) {
+  // A diagnostic's summary is known without making anything of it.
+  const auto lonely = [](std::vector<Diagnostic> all) {
+    std::erase_if(all, [](const Diagnostic& one) { return !one.experimentOnly || !one.usedBy.empty(); });
+    return all;
+  };
+  const Survey survey = surveyOf(options, installation, lonely);
+  std::vector<DescribedDiagnostic> listed;
+  for (const DescribedDiagnostic& one : survey.catalogue) {
+    if (one.diagnostic.usedBy.empty()) listed.push_back(one);
+  }
+  std::ostringstream text;
+  if (options.report.format == Format::kJson) {
+    text << documentText(listDocument(listed));
+  } else {
+    printList(text, listed);
+  }
+  writeAnswer(options.report, console, text.str());
+  return tellFailed(survey.failed, console, ExitCode::kAllPassed);
+}
+
+ExitCode describe(const Options& options, const Installation& installation, Console& console) {
+  const Selection selection = select(options, installation);
+  std::ostringstream text;
+  if (options.report.format == Format::kJson) {
+    text << documentText(descriptionDocument(selection.diagnostics));
+  } else {
+    printDescriptions(text, selection.diagnostics);
+  }
+  writeAnswer(options.report, console, text.str());
+  ExitCode code = ExitCode::kAllPassed;
+  for (const BoundDiagnostic& one : selection.diagnostics) {
+    if (one.described.description.error != nullptr) code = ExitCode::kError;
+  }
+  return tellFailed(selection.failed, console, code);
+}
+
+ExitCode explainErrors(const Options& options, const Installation& installation, Console& console) {
+  std::ostringstream text;
+  explain(options.names, installation.explanations(), options.report.format == Format::kJson, text);
+  writeAnswer(options.report, console, text.str());
+  return ExitCode::kAllPassed;
+}
+
+ExitCode perform(const Options& options, const Installation& installation, Console& console) {
+  switch (options.command) {
+    case Command::kList: return list(options, installation, console);
+    case Command::kDescribe: return describe(options, installation, console);
+    case Command::kRun:
+    case Command::kExperiment: return runCommand(options, installation, console);
+    case Command::kVerify: return verifyCommand(options, console);
+    case Command::kAnalyze: return analyzeCommand(options, installation, console);
+    case Command::kDiff: return diffCommand(options, console);
+    case Command::kExplain: return explainErrors(options, installation, console);
+    case Command::kDoctor: return doctorCommand(options, installation, console);
+    case Command::kSelftest: return selftestCommand(options, installation, console);
+    case Command::kPhone: return phoneCommand(options, console);
+    case Command::kCompletion: break;
+  }
+  console.out << completionScript(options.names.front()) << std::flush;
+  return ExitCode::kAllPassed;
+}
+
+}  // namespace
+
+ExitCode runProgram(const std::vector<std::string>& arguments, const Installation& installation, Console& console) {
+  if (!arguments.empty() && arguments.front() == kCompletionRequest) {
+    for (const std::string& one : completionsOf({arguments.begin() + 1, arguments.end()}, installation)) {
+      console.out << one << '\n';
+    }
+    return ExitCode::kAllPassed;
+  }
+  ExitCode code = ExitCode::kInternal;
+  const std::optional<Options> options = parseCommandLine(arguments, console.out, console.err, &code);
+  if (!options) return code;
+  try {
+    return perform(*options, installation, console);
+  } catch (const Refusal& refusal) {
+    console.err << "quazor: " << printable(refusal.what()) << '\n';
+    return refusal.code();
+  }
+}
+
+}  // namespace quazor

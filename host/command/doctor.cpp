@@ -1,0 +1,141 @@
+#include "host/command/doctor.h"
+
+#include "contract/message_format.h"
+#include "host/command/explanations.h"
+#include "host/command/selection.h"
+#include "host/device/phone.h"
+#include "host/plugin/profile.h"
+#include "host/record/last_run.h"
+#include "host/text/table.h"
+
+#include <algorithm>
+#include <cstddef>
+#include <functional>
+#include <string>
+#include <utility>
+
+namespace quazor {
+
+namespace {
+
+class Doctor {
+ public:
+  Doctor(const Options& options, const Installation& installation, Console& console)
+      : options_(options), installation_(installation), console_(console) {}
+
+  ExitCode examine() {
+    std::vector<std::filesystem::path> plugins = options_.plugins;
+    if (plugins.empty()) plugins = installation_.allPlugins();
+    if (plugins.empty()) {
+      tell(false, "plug-in", installation_.defaultPlugin().string(), "there is no plug-in in this directory");
+    }
+    for (const std::filesystem::path& plugin : plugins) {
+      check("plug-in", plugin.string(), [&] { return findingOfPlugin(plugin); });
+    }
+    const std::filesystem::path profile = installation_.defaultProfile();
+    check("profile", profile.string(), [&] {
+      const Profile read = readProfile(profile);
+      return "entries for " + countText(read.entries.size(), "diagnostic") + " and " +
+             countText(read.experiments.size(), "experiment");
+    });
+    checkPhones();
+    check("explanations", installation_.explanations().string(),
+          [&] { return countText(readExplanations(installation_.explanations()).size(), "explanation"); });
+    checkLastRun();
+    console_.out.flush();
+    return allFine_ ? ExitCode::kAllPassed : ExitCode::kCannotRead;
+  }
+
+ private:
+  // `look` returns what there is, or throws the Refusal that says what is wrong.
+  void check(std::string_view kind, const std::string& name, const std::function<std::string()>& look) {
+    try {
+      tell(true, kind, name, look());
+    } catch (const Refusal& refusal) {
+      tell(false, kind, name, refusal.what());
+    }
+  }
+
+  void tell(bool fine, std::string_view kind, const std::string& name, const std::string& finding) {
+    allFine_ = allFine_ && fine;
+    console_.out << (fine ? "ok       " : "REFUSED  ") << kind << ' ' << printable(name) << "\n           "
+                 << printable(finding) << '\n';
+  }
+
+  // Each is loaded alone, so that one that cannot be loaded does not hide another.
+  std::string findingOfPlugin(const std::filesystem::path& plugin) const {
+    Options alone = options_;
+    alone.plugins = {plugin};
+    const Survey survey = surveyOf(alone, installation_, [](const std::vector<Diagnostic>& all) { return all; });
+    if (!survey.failed.empty()) {
+      throw Refusal(ExitCode::kCannotRead, survey.failed.front().error->localizedDescription());
+    }
+    std::size_t diagnostics = 0;
+    for (const DescribedDiagnostic& one : survey.catalogue) {
+      if (one.description.error != nullptr) {
+        throw Refusal(ExitCode::kCannotRead,
+                      one.diagnostic.name + " cannot be described: " + one.description.error->localizedDescription());
+      }
+      if (!one.diagnostic.experimentOnly) ++diagnostics;
+    }
+    return countText(diagnostics, "diagnostic") + ", " + countText(survey.catalogue.size() - diagnostics, "experiment");
+  }
+
+  void checkPhones() {
+    const std::vector<std::string> names = installation_.scenarioNames();
+    check("backend", "simulated", [&] {
+      phonesOfScenario(installation_.defaultScenario(), false, 0)();
+      return "the healthy phone can be made; " + countText(names.size(), "phone") + " installed";
+    });
+    for (const std::string& name : names) {
+      try {
+        summaryOfScenario(installation_.scenario(name));
+      } catch (const Refusal& refusal) {
+        tell(false, "phone", name, refusal.what());
+      }
+    }
+    checkBindings();
+    check("backend", "real time (--realtime)", [&] {
+      phonesOfScenario(installation_.defaultScenario(), true, 0)();
+      return std::string("the healthy phone can be made");
+    });
+  }
+
+  void checkBindings() {
+    const std::vector<std::string> names = installation_.bindingNames();
+    const std::string here = "this machine can be asked: quazor phone probe; ";
+    tell(true, "backend", "linux (--phone linux:FILE)", here + countText(names.size(), "binding") + " installed");
+    for (const std::string& name : names) {
+      try {
+        phonesOfBinding(installation_.binding(name));
+      } catch (const Refusal& refusal) {
+        tell(false, "binding", name, refusal.what());
+      }
+    }
+  }
+
+  void checkLastRun() {
+    const std::filesystem::path file = lastRunFile();
+    if (file.empty()) {
+      tell(true, "last run", "-", "not kept: neither XDG_STATE_HOME nor HOME is set");
+    } else if (!std::filesystem::exists(file)) {
+      tell(true, "last run", file.string(), "there was none");
+    } else {
+      check("last run", file.string(),
+            [&] { return countText(namesNotPassed(runIn(file)).size(), "diagnostic") + " did not pass"; });
+    }
+  }
+
+  const Options& options_;
+  const Installation& installation_;
+  Console& console_;
+  bool allFine_ = true;
+};
+
+}  // namespace
+
+ExitCode doctorCommand(const Options& options, const Installation& installation, Console& console) {
+  return Doctor(options, installation, console).examine();
+}
+
+}  // namespace quazor

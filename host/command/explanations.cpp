@@ -1,0 +1,274 @@
+#include "host/command/explanations.h"
+
+#include "base/json/json_cursor.h"
+#include "base/text/nearest_name.h"
+#include "contract/message_format.h"
+#include "host/error/exit_code.h"
+#include "host/plugin/catalogue.h"
+
+#include <algorithm>
+#include <array>
+#include <charconv>
+#include <map>
+#include <optional>
+#include <system_error>
+#include <utility>
+
+namespace quazor {
+
+namespace {
+
+constexpr std::uint64_t kSchema = 1;
+constexpr std::array<std::string_view, 4> kKinds{"diagnostic", "experiment", "analysis", "result"};
+
+[[noreturn]] void refuse(const std::string& file, const std::string& what) {
+  throw Refusal(ExitCode::kCannotRead, "the explanations in '" + file + "' cannot be used: " + what);
+}
+
+std::string lineOf(const JsonCursor& cursor) {
+  std::string text = cursor.text();
+  const auto isControl = [](char unit) { return static_cast<unsigned char>(unit) < 0x20 || unit == 0x7F; };
+  if (text.front() == ' ' || text.back() == ' ' || std::ranges::any_of(text, isControl)) {
+    cursor.fail("the text must be one line without blanks at its ends.");
+  }
+  return text;
+}
+
+std::string optionalLine(const JsonCursor& object, std::string_view key) {
+  const std::optional<JsonCursor> entry = object.find(key);
+  return entry ? lineOf(*entry) : std::string();
+}
+
+std::vector<std::string> linesOf(const JsonCursor& array) {
+  std::vector<std::string> lines;
+  for (const JsonCursor& element : array.elements()) {
+    lines.push_back(lineOf(element));
+    if (std::find(lines.begin(), lines.end() - 1, lines.back()) != lines.end() - 1) element.fail("this stands twice.");
+  }
+  if (lines.empty()) array.fail("at least one must stand there.");
+  return lines;
+}
+
+std::vector<std::string> optionalLines(const JsonCursor& object, std::string_view key) {
+  const std::optional<JsonCursor> entry = object.find(key);
+  return entry ? linesOf(*entry) : std::vector<std::string>();
+}
+
+// What errors and names have in common.
+Explanation explanationOf(const JsonCursor& object) {
+  Explanation explanation;
+  explanation.title = lineOf(object.at("title"));
+  explanation.meaning = lineOf(object.at("meaning"));
+  explanation.causes = linesOf(object.at("causes"));
+  explanation.next = linesOf(object.at("next"));
+  return explanation;
+}
+
+ExplainedMessage messageOf(const JsonCursor& object) {
+  object.allowKeys({"text", "from", "meaning"});
+  return {lineOf(object.at("text")), linesOf(object.at("from")), optionalLine(object, "meaning")};
+}
+
+Explanation errorOf(const JsonCursor& object, const std::string& domain) {
+  object.allowKeys({"code", "symbols", "title", "meaning", "messages", "causes", "next"});
+  Explanation explanation = explanationOf(object);
+  explanation.domain = domain;
+  explanation.code = object.at("code").integer();
+  explanation.symbols = optionalLines(object, "symbols");
+  if (const std::optional<JsonCursor> messages = object.find("messages")) {
+    for (const JsonCursor& message : messages->elements()) explanation.messages.push_back(messageOf(message));
+  }
+  return explanation;
+}
+
+Explanation namedOf(const JsonCursor& object) {
+  object.allowKeys({"names", "kind", "from", "title", "meaning", "failing", "causes", "next"});
+  Explanation explanation = explanationOf(object);
+  explanation.names = linesOf(object.at("names"));
+  explanation.kind = object.at("kind").oneOf(kKinds, "a kind");
+  if (explanation.kind == "result") {
+    explanation.from = linesOf(object.at("from"));
+  } else if (const std::optional<JsonCursor> from = object.find("from")) {
+    from->fail("only a result has it.");
+  }
+  explanation.failing = optionalLine(object, "failing");
+  return explanation;
+}
+
+std::vector<Explanation> explanationsOf(const JsonCursor& document) {
+  document.allowKeys({"$schema", "schema", "domain", "errors", "names"});
+  document.at("schema").integer(kSchema, kSchema);
+  std::vector<Explanation> explanations;
+  const std::optional<JsonCursor> names = document.find("names");
+  if (names) {
+    if (document.find("domain") || document.find("errors")) document.fail("a file has either errors or names.");
+    for (const JsonCursor& entry : names->elements()) explanations.push_back(namedOf(entry));
+  } else {
+    const std::string domain = lineOf(document.at("domain"));
+    for (const JsonCursor& entry : document.at("errors").elements()) explanations.push_back(errorOf(entry, domain));
+  }
+  return explanations;
+}
+
+std::vector<std::string> keysOf(const Explanation& explanation) {
+  if (explanation.isError()) return {keyOf(explanation.domain, explanation.code)};
+  return explanation.names;
+}
+
+std::vector<std::filesystem::path> filesIn(const std::filesystem::path& directory) {
+  std::error_code problem;
+  std::vector<std::filesystem::path> files;
+  for (const auto& entry : std::filesystem::directory_iterator(directory, problem)) {
+    const std::filesystem::path& file = entry.path();
+    if (file.extension() == ".json" && file.stem().extension() != ".schema") files.push_back(file);
+  }
+  if (problem) refuse(directory.string(), problem.message() + ".");
+  std::sort(files.begin(), files.end());
+  return files;
+}
+
+template <class Read>
+std::vector<Explanation> reading(const std::string& file, const Read& read) {
+  nlohmann::ordered_json document;
+  try {
+    document = read();
+  } catch (const JsonProblem& problem) {  // it names the file
+    throw Refusal(ExitCode::kCannotRead, problem.what());
+  }
+  try {
+    return explanationsOf(JsonCursor(document));
+  } catch (const JsonProblem& problem) {
+    refuse(file, problem.what());
+  }
+}
+
+std::optional<std::int64_t> integerOf(std::string_view text) {
+  std::int64_t number = 0;
+  const auto [end, problem] = std::from_chars(text.data(), text.data() + text.size(), number);
+  return problem == std::errc() && end == text.data() + text.size() ? std::optional(number) : std::nullopt;
+}
+
+struct ErrorKey {
+  std::string domain;
+  std::int64_t code;
+};
+
+std::optional<ErrorKey> errorKeyOf(const std::string& asked) {
+  const std::size_t colon = asked.rfind(':');
+  if (colon == std::string::npos) return std::nullopt;
+  const std::optional<std::int64_t> code = integerOf(std::string_view(asked).substr(colon + 1));
+  return code ? std::optional(ErrorKey{asked.substr(0, colon), *code}) : std::nullopt;
+}
+
+template <class Fits>
+std::vector<const Explanation*> thoseThat(const std::vector<Explanation>& explanations, const Fits& fits) {
+  std::vector<const Explanation*> found;
+  for (const Explanation& one : explanations) {
+    if (fits(one)) found.push_back(&one);
+  }
+  return found;
+}
+
+bool holds(const std::vector<std::string>& texts, const std::string& text) {
+  return std::ranges::find(texts, text) != texts.end();
+}
+
+// What tells domains apart: their names without the ending that all have.
+std::string stemOf(const std::string& domain) {
+  constexpr std::string_view kEnding = "ErrorDomain";
+  return domain.ends_with(kEnding) ? domain.substr(0, domain.size() - kEnding.size()) : domain;
+}
+
+std::string nearestDomain(const std::vector<Explanation>& explanations, const std::string& domain) {
+  std::string nearest;
+  std::vector<std::string> stems;
+  for (const Explanation& one : explanations) {
+    if (one.isError()) stems.push_back(stemOf(one.domain));
+  }
+  const std::optional<std::string> stem = nearestName(stemOf(domain), stems);
+  for (const Explanation& one : explanations) {
+    if (stem && one.isError() && stemOf(one.domain) == *stem) nearest = one.domain;
+  }
+  return nearest;
+}
+
+[[noreturn]] void refuseKey(const std::vector<Explanation>& explanations, const ErrorKey& key) {
+  std::string codes;
+  for (const Explanation& one : explanations) {
+    if (one.isError() && one.domain == key.domain) codes += (codes.empty() ? "" : ", ") + std::to_string(one.code);
+  }
+  if (!codes.empty()) {
+    throw Refusal(ExitCode::kUsage,
+                  formatMessage("no explanation of code %@ in '%@'; it has %@", key.code, key.domain, codes));
+  }
+  const std::string nearest = nearestDomain(explanations, key.domain);
+  throw Refusal(ExitCode::kUsage,
+                formatMessage("no explanation of the error domain '%@'; %@", key.domain,
+                              nearest.empty() ? "where the report says 'caused by', ask for the error above it"
+                                              : "did you mean '" + nearest + "'?"));
+}
+
+[[noreturn]] void refuseName(const std::vector<Explanation>& explanations, const std::string& asked) {
+  std::vector<std::string> known;
+  for (const Explanation& one : explanations) {
+    known.insert(known.end(), one.names.begin(), one.names.end());
+    known.insert(known.end(), one.symbols.begin(), one.symbols.end());
+    if (one.isError()) known.push_back(one.domain);
+  }
+  const std::string nearest = didYouMean(asked, known);
+  throw Refusal(ExitCode::kUsage, formatMessage("no explanation of '%@'%@", asked,
+                                                nearest.empty() ? "; 'quazor explain' lists what there is" : nearest));
+}
+
+}  // namespace
+
+std::string keyOf(std::string_view domain, std::int64_t code) { return formatMessage("%@:%@", domain, code); }
+
+std::vector<Explanation> parseExplanations(const std::string& file, std::string_view text) {
+  return reading(file, [&] { return parseJson(text, file); });
+}
+
+std::vector<Explanation> readExplanations(const std::filesystem::path& directory) {
+  std::vector<Explanation> all;
+  std::map<std::string, std::string> seen;  // what is explained, and the file that does it
+  for (const std::filesystem::path& file : filesIn(directory)) {
+    for (Explanation& one : reading(file.string(), [&] { return readJsonFile(file); })) {
+      for (const std::string& key : keysOf(one)) {
+        const auto [earlier, isNew] = seen.emplace(key, file.string());
+        if (!isNew) refuse(file.string(), "'" + key + "' is explained in '" + earlier->second + "' already.");
+      }
+      all.push_back(std::move(one));
+    }
+  }
+  if (all.empty()) refuse(directory.string(), "there are none.");
+  return all;
+}
+
+std::vector<const Explanation*> findExplanations(const std::vector<Explanation>& explanations,
+                                                 const std::string& asked) {
+  std::vector<const Explanation*> found;
+  if (const std::optional<ErrorKey> key = errorKeyOf(asked)) {
+    found = thoseThat(explanations, [&](const Explanation& one) {
+      return one.isError() && one.domain == key->domain && one.code == key->code;
+    });
+    if (found.empty()) refuseKey(explanations, *key);
+    return found;
+  }
+  if (const std::optional<std::int64_t> code = integerOf(asked)) {
+    found = thoseThat(explanations, [&](const Explanation& one) { return one.isError() && one.code == *code; });
+    if (found.empty()) throw Refusal(ExitCode::kUsage, "no error domain has an explanation of code " + asked);
+    return found;
+  }
+  found = thoseThat(explanations, [&](const Explanation& one) {
+    return (one.isError() && one.domain == asked) || holds(one.symbols, asked) || holds(one.names, asked);
+  });
+  if (found.empty() && isPattern(asked)) {
+    found = thoseThat(explanations, [&](const Explanation& one) {
+      return std::ranges::any_of(one.names, [&](const std::string& name) { return matchesName(asked, name); });
+    });
+  }
+  if (found.empty()) refuseName(explanations, asked);
+  return found;
+}
+
+}  // namespace quazor

@@ -1,0 +1,25 @@
+#include "host/command/phone_command.h"
+
+#include "host/command/answer.h"
+#include "host/device/phone.h"
+#include "host/text/table.h"
+
+namespace quazor {
+
+ExitCode phoneCommand(const Options& options, Console& console) {
+  const PhoneProbe probe = probeThisMachine();
+  for (const std::string& line : probe.lines) console.out << printable(line) << '\n';
+  if (options.report.output.empty()) {
+    console.out
+        << "\nA binding to start from: save it, say which camera is which, and give it with --phone linux:FILE.\n\n";
+  }
+  writeAnswer(options.report, console, probe.binding);
+  if (!options.report.output.empty()) {
+    console.out << "\nA binding to start from is in " << printable(options.report.output.string())
+                << ": say there which camera is which, and give it with --phone linux:FILE.\n";
+  }
+  console.out.flush();
+  return ExitCode::kAllPassed;
+}
+
+}  // namespace quazor

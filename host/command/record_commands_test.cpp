@@ -1,0 +1,107 @@
+#include "host/command/record_commands.h"
+
+#include "host/record/record_file.h"
+#include "host/testing/test_directory.h"
+#include "host/testing/test_events.h"
+
+#include <gmock/gmock.h>
+#include <gtest/gtest.h>
+
+#include <sstream>
+
+namespace quazor {
+namespace {
+
+using testing::HasSubstr;
+
+class RecordCommandsTest : public testing::Test {
+ protected:
+  std::filesystem::path record(const std::string& name, const std::vector<RunEvent>& events) const {
+    RecordWriter writer(directory_.path() / name);
+    for (const RunEvent& event : events) writer.take(event);
+    return writer.file();
+  }
+
+  ExitCode verify(const std::filesystem::path& file) {
+    out_.str("");
+    Options options;
+    options.records = {file};
+    return verifyCommand(options, console_);
+  }
+
+  ExitCode diff(const std::filesystem::path& before, const std::filesystem::path& after) {
+    out_.str("");
+    Options options;
+    options.records = {before, after};
+    return diffCommand(options, console_);
+  }
+
+  TestDirectory directory_;
+  std::ostringstream out_;
+  std::ostringstream err_;
+  Console console_{out_, err_};
+};
+
+TEST_F(RecordCommandsTest, VerifyCountsWhatItHasSeen) {
+  EXPECT_EQ(verify(record("a", wholeRun())), ExitCode::kAllPassed);
+  EXPECT_EQ(out_.str(), std::to_string(wholeRun().size()) + " events, 4 verdicts, 0 problems\n");
+}
+
+TEST_F(RecordCommandsTest, VerifyTellsWhatIsWrong) {
+  std::vector<RunEvent> events = {runOf({"A\n"}), beginningOf("A\n"), DiagnosticEnded{Verdict::kPass, momentAt(3)},
+                                  RunEnded{std::nullopt, momentAt(4)}};
+  EXPECT_EQ(verify(record("a", events)), ExitCode::kFailed);
+  EXPECT_EQ(
+      out_.str(),
+      "WRONG  A\\x0a has the failure none of quazor's own, but QuazorHostErrorDomain 9 'the run was not completed' "
+      "follows from its results, limits and errors\n"
+      "WRONG  A\\x0a has the verdict pass, but error follows from its results, limits and errors\n"
+      "4 events, 1 verdict, 2 problems\n");
+}
+
+TEST_F(RecordCommandsTest, VerifyTellsThatARunDidNotComeToItsEnd) {
+  std::vector<RunEvent> events = wholeRun();
+  events.pop_back();
+  EXPECT_EQ(verify(record("a", events)), ExitCode::kAllPassed);
+  EXPECT_THAT(out_.str(), testing::EndsWith("0 problems\nThe run did not come to its end.\n"));
+  const std::string text = directory_.read("a");
+  EXPECT_EQ(verify(directory_.write("b", text.substr(0, text.size() - 3))), ExitCode::kAllPassed);
+  EXPECT_THAT(out_.str(),
+              testing::EndsWith("The run did not come to its end, and the record's last line is cut off.\n"));
+  EXPECT_EQ(verify(record("c", {runOf({})})), ExitCode::kAllPassed);
+  EXPECT_THAT(out_.str(), testing::StartsWith("1 event, 0 verdicts, 0 problems\n"));
+}
+
+TEST_F(RecordCommandsTest, DiffTellsWhatIsDifferent) {
+  std::vector<RunEvent> events = wholeRun();
+  const std::filesystem::path whole = record("a", events);
+  EXPECT_EQ(diff(whole, whole), ExitCode::kAllPassed);
+  EXPECT_EQ(out_.str(), "The records tell the same.\n");
+  std::get<DiagnosticBegan>(events[1]).name = "Go\nod";
+  EXPECT_EQ(diff(whole, record("b", events)), ExitCode::kFailed);
+  EXPECT_EQ(out_.str(), "Good is only in the first\nGo\\x0aod is only in the second\n");
+}
+
+TEST_F(RecordCommandsTest, NeedRecords) {
+  const std::filesystem::path whole = record("a", wholeRun());
+  EXPECT_THROW(verify(directory_.path() / "nothing"), Refusal);
+  EXPECT_THROW(diff(whole, directory_.path() / "nothing"), Refusal);
+  EXPECT_THROW(diff(directory_.path() / "nothing", whole), Refusal);
+}
+
+TEST_F(RecordCommandsTest, TellWhenTheStandardOutputCannotBeWritten) {
+  const std::filesystem::path whole = record("a", wholeRun());
+  out_.setstate(std::ios::badbit);
+  for (const auto& action : {std::function<void()>([&] { verify(whole); }), {[&] { diff(whole, whole); }}}) {
+    try {
+      action();
+      ADD_FAILURE() << "it went well";
+    } catch (const Refusal& refusal) {
+      EXPECT_EQ(refusal.code(), ExitCode::kCannotWrite);
+      EXPECT_THAT(refusal.what(), HasSubstr("the standard output cannot be written"));
+    }
+  }
+}
+
+}  // namespace
+}  // namespace quazor

@@ -1,0 +1,259 @@
+#include "host/command/run_command.h"
+
+#include "contract/contract.h"
+#include "host/command/rerun.h"
+#include "host/command/selection.h"
+#include "host/device/phone.h"
+#include "host/error/host_error.h"
+#include "host/run/isolation.h"
+#include "host/run/run_events.h"
+#include "host/system/interrupt_watcher.h"
+#include "host/system/output_file.h"
+#include "host/text/table.h"
+#include "host/text/timestamp.h"
+
+#include <unistd.h>
+
+#include <algorithm>
+#include <optional>
+#include <utility>
+
+namespace quazor {
+
+namespace {
+
+// What is to be done for each diagnostic.
+struct Job {
+  BoundDiagnostic bound;
+  const QZExperimentResult* result = nullptr;  // to be analysed; null: the experiment is run
+  std::uint64_t seed = 0;
+};
+
+// Does the jobs, one after the other, each in a process of its own or all in this one.
+class Conductor {
+ public:
+  Conductor(IsolationOptions isolation, const Options& options, RunOptions runOptions, RunEvents& events)
+      : isolation_(std::move(isolation)),
+        runOptions_(std::move(runOptions)),
+        inProcess_(options.inProcess),
+        events_(events) {
+    if (!inProcess_) signals_.emplace();
+  }
+
+  // What the user interrupted, as RunEnded has it; nothing when the run goes on.
+  std::optional<std::string> perform(const Job& job) {
+    const auto& [diagnostic, description] = job.bound.described;
+    events_.take(DiagnosticBegan{diagnostic.name, job.bound.described.summary(), diagnostic.experimentName,
+                                 diagnostic.analysisName, diagnostic.experimentOnly, job.bound.parameters, job.seed,
+                                 dateNow()});
+    std::optional<std::string> interrupted;
+    if (description.error != nullptr) {
+      events_.take(Failed{Stage::kDescribe, description.error});
+    } else if (inProcess_) {
+      performHere(job);
+    } else if (!runIsolated(isolation_, *signals_, diagnostic, job.bound.parameters, runOptions_, job.result,
+                            events_.progress(), events_)) {
+      interrupted = diagnostic.name;
+    } else if (signals_->requestsToEnd() > 0) {
+      interrupted = "";  // it was asked to end when there was nothing more to end
+    }
+    events_.endDiagnostic();
+    return interrupted;
+  }
+
+ private:
+  void performHere(const Job& job) {
+    const Diagnostic& diagnostic = job.bound.described.diagnostic;
+    if (job.result != nullptr) {
+      analyseResult(diagnostic, job.bound.parameters, *job.result, runOptions_.logLevel, events_);
+    } else {
+      runDiagnostic(diagnostic, job.bound.parameters, runOptions_, events_);
+    }
+  }
+
+  const IsolationOptions isolation_;
+  const RunOptions runOptions_;
+  const bool inProcess_;
+  RunEvents& events_;
+  std::optional<WatchedSignals> signals_;
+};
+
+// A plug-in that could not be loaded stands in the report like a diagnostic.
+void tellFailedPlugin(const FailedPlugin& plugin, RunEvents& events) {
+  events.take(DiagnosticBegan{
+      plugin.file.filename().string(), "A plug-in that could not be loaded.", {}, {}, false, {}, 0, dateNow()});
+  events.take(Failed{Stage::kLoad, plugin.error});
+  events.endDiagnostic();
+}
+
+RunBegan beginningOf(const Options& options, const Installation& installation, const std::vector<Job>& jobs,
+                     const std::vector<FailedPlugin>& failed) {
+  RunBegan began{QUAZOR_VERSION, QUAZOR_CONTRACT_VERSION, dateNow(), {}, {}, options.seed, false, {}};
+  for (const auto& file : isolationOf(options, installation).plugins) began.plugins.push_back(file.string());
+  began.ofExperiments = options.command == Command::kExperiment;
+  for (const FailedPlugin& plugin : failed) began.names.push_back(plugin.file.filename().string());
+  for (const Job& job : jobs) began.names.push_back(job.bound.described.diagnostic.name);
+  return began;
+}
+
+// Before anything runs: an output that cannot be written would make the whole run worthless.
+void checkOutputs(const Options& options) {
+  std::vector<std::filesystem::path> regular;
+  const auto check = [&regular](const std::filesystem::path& file) {
+    std::error_code error;
+    if (file.empty() || (std::filesystem::exists(file, error) && !std::filesystem::is_regular_file(file, error)))
+      return;
+    const std::filesystem::path target = std::filesystem::weakly_canonical(std::filesystem::absolute(file), error);
+    if (std::find(regular.begin(), regular.end(), target) != regular.end()) {
+      throw Refusal(ExitCode::kUsage, "the file '" + file.string() + "' is to be written twice");
+    }
+    regular.push_back(target);
+  };
+  const auto checkReport = [&check](const std::filesystem::path& file) {
+    if (const std::string why = problemOfOutputFile(file); !why.empty()) {
+      throw Refusal(ExitCode::kCannotWrite, "the output file '" + file.string() + "' cannot be written: " + why);
+    }
+    check(file);
+  };
+  check(options.record);
+  if (!options.report.output.empty()) checkReport(options.report.output);
+  for (const OutputRequest& output : options.report.outputs) checkReport(output.file);
+}
+
+RunEventOptions eventOptions(const Options& options, bool keepsLastRun) {
+  return {options.record, keepsLastRun, options.systemLog, options.report};
+}
+
+ExitCode perform(const Options& options, const Installation& installation, Console& console, RunBegan began,
+                 const std::vector<Job>& jobs, const std::vector<FailedPlugin>& failed, const RunOptions& runOptions) {
+  checkOutputs(options);
+  RunEvents events(eventOptions(options, options.command == Command::kRun), console);
+  std::optional<InterruptWatcher> watcher;
+  if (options.inProcess) {
+    watcher.emplace([&events] { events.interruptAndLeave([] { ::_exit(static_cast<int>(ExitCode::kInterrupted)); }); });
+  }
+  Conductor conductor(withoutFailed(isolationOf(options, installation), failed), options, runOptions, events);
+  events.take(std::move(began));
+  for (const FailedPlugin& plugin : failed) tellFailedPlugin(plugin, events);
+  for (const Job& job : jobs) {
+    if (std::optional<std::string> interrupted = conductor.perform(job)) {
+      events.take(RunEnded{std::move(interrupted), dateNow()});
+      return ExitCode::kInterrupted;
+    }
+  }
+  events.take(RunEnded{std::nullopt, dateNow()});
+  return events.exitCode();
+}
+
+// There is nothing to run again, and what was asked for to be written says so.
+ExitCode performNothing(const Options& options, const Installation& installation, Console& console) {
+  checkOutputs(options);
+  const bool isForPeople = options.report.format == Format::kText || !options.report.output.empty();
+  (isForPeople ? console.out : console.err) << "Everything passed in the last run.\n" << std::flush;
+  RunEvents events(eventOptions(options, false), console);
+  RunBegan began = beginningOf(options, installation, {}, {});
+  began.phone = options.phone.string();
+  events.take(std::move(began));
+  events.take(RunEnded{std::nullopt, dateNow()});
+  return events.exitCode();
+}
+
+// The phone that the options mean, by its name in records.
+std::string choosePhone(const Options& options, const Installation& installation, PhoneMaker* makePhone) {
+  if (const auto binding = bindingNamed(options.phone)) {
+    const std::filesystem::path file = installation.binding(*binding);
+    *makePhone = phonesOfBinding(file);
+    return std::string(kLinuxPrefix) + file.string();
+  }
+  const std::filesystem::path scenario =
+      options.phone.empty() ? installation.defaultScenario() : installation.scenario(options.phone);
+  *makePhone = phonesOfScenario(scenario, options.realTime, options.seed);
+  return scenario.string();
+}
+
+}  // namespace
+
+ExitCode runCommand(const Options& given, const Installation& installation, Console& console) {
+  const Options options = given.onlyFailed ? optionsToRunAgain(given) : given;
+  if (options.onlyFailed && options.names.empty()) return performNothing(options, installation, console);
+  Selection selection = select(options, installation);
+  std::vector<Job> jobs;
+  for (BoundDiagnostic& one : selection.diagnostics) {
+    requireParameters(one.described, one.parameters);
+    jobs.push_back({std::move(one), nullptr, options.seed});
+  }
+  RunOptions runOptions;
+  const std::string phone = choosePhone(options, installation, &runOptions.makePhone);
+  runOptions.logLevel = options.logLevel.value_or(LogLevel::kDefault);
+  RunBegan began = beginningOf(options, installation, jobs, selection.failed);
+  began.phone = phone;
+  return perform(options, installation, console, std::move(began), jobs, selection.failed, runOptions);
+}
+
+namespace {
+
+// The parameters of a recorded run, with those of its analysis replaced that are set now.
+BoundParameters reboundParameters(const DiagnosticRecord& record, const BoundDiagnostic& now) {
+  BoundParameters parameters{record.parameters.experiment, now.parameters.analysis};
+  for (BoundParameter& one : parameters.analysis) {
+    const auto& before = record.parameters.analysis;
+    const auto found = std::find_if(before.begin(), before.end(),
+                                    [&one](const BoundParameter& other) { return other.name == one.name; });
+    if (one.value || found == before.end() || !found->value) continue;
+    one.value = found->value;
+    one.source = found->source + ", in the record";
+  }
+  return parameters;
+}
+
+}  // namespace
+
+ExitCode analyzeCommand(const Options& given, const Installation& installation, Console& console) {
+  const RecordedRun run = runIn(given.records.front());
+  Options options = given;
+  if (options.profile.empty()) options.withoutProfile = true;  // the record has what the profile set then
+  for (Setting& setting : options.settings) {
+    if (setting.half == Half::kExperiment) {
+      throw Refusal(ExitCode::kUsage, "--set '" + setting.text + "': analyze runs no experiment");
+    }
+    setting.half = Half::kAnalysis;
+  }
+  std::vector<const DiagnosticRecord*> analysable;
+  for (const DiagnosticRecord& record : run.records) {
+    const bool hasResult = std::any_of(record.stages.begin(), record.stages.end(),
+                                       [](const StagePeriod& one) { return one.stage == Stage::kAnalyse; });
+    if (record.experimentOnly) continue;
+    if (hasResult) {
+      analysable.push_back(&record);
+      options.names.push_back(record.name);
+    } else {
+      console.err << "quazor: " << printable(record.name)
+                  << " has no experiment's result in the record; it is left out\n";
+    }
+  }
+  if (analysable.empty()) {
+    throw Refusal(ExitCode::kCannotRead, "the record '" + given.records.front().string() +
+                                             "' holds no experiment's result that could be analysed");
+  }
+  if (options.plugins.empty()) options.plugins.assign(run.began.plugins.begin(), run.began.plugins.end());
+  const Selection selection = select(options, installation);
+  std::vector<QZExperimentResult> results(analysable.size());
+  std::vector<Job> jobs;
+  for (std::size_t i = 0; i < analysable.size(); ++i) {
+    const DiagnosticRecord& record = *analysable[i];
+    for (const BoundDiagnostic& one : selection.diagnostics) {
+      if (one.described.diagnostic.name != record.name) continue;
+      results[i].measurements() = record.measurements;
+      results[i].auxiliaryData() = record.auxiliaryData;
+      jobs.push_back({{one.described, reboundParameters(record, one)}, &results[i], record.seed});
+    }
+  }
+  RunOptions runOptions;
+  runOptions.logLevel = options.logLevel.value_or(LogLevel::kDefault);
+  RunBegan began = beginningOf(options, installation, jobs, selection.failed);
+  began.phone = run.began.phone;
+  began.seed = run.began.seed;
+  return perform(options, installation, console, std::move(began), jobs, selection.failed, runOptions);
+}
+
+}  // namespace quazor

@@ -1,0 +1,134 @@
+#include "host/command/selection.h"
+
+#include "host/plugin/plugin_loader.h"
+#include "host/plugin/profile.h"
+
+#include <algorithm>
+#include <utility>
+
+namespace quazor {
+
+namespace {
+
+Wanted wantedBy(Command command) {
+  if (command == Command::kRun) return Wanted::kDiagnostics;
+  return command == Command::kExperiment ? Wanted::kExperiments : Wanted::kDescribable;
+}
+
+std::vector<Diagnostic> allWanted(const std::vector<Diagnostic>& catalogue, Wanted wanted, bool mayBeNone) {
+  std::vector<Diagnostic> all = allOf(catalogue, wanted);
+  if (!all.empty() || mayBeNone) return all;
+  if (wanted == Wanted::kExperiments) throw Refusal(ExitCode::kUsage, "the loaded plug-ins have no experiment");
+  const std::string hint = catalogue.empty() ? "" : ", only experiments; 'quazor experiment --all' runs them";
+  throw Refusal(ExitCode::kUsage, "the loaded plug-ins have no diagnostic" + hint);
+}
+
+std::vector<Diagnostic> wantedOf(const std::vector<Diagnostic>& catalogue, const Options& options, bool mayBeNone) {
+  const Wanted wanted = wantedBy(options.command);
+  if (options.all) return allWanted(catalogue, wanted, mayBeNone);
+  std::vector<std::string> names = options.names;
+  if (mayBeNone) {
+    std::erase_if(names, [&](const std::string& name) {
+      return std::none_of(catalogue.begin(), catalogue.end(),
+                          [&name](const Diagnostic& one) { return matchesName(name, one.name); });
+    });
+  }
+  return selectDiagnostics(catalogue, wanted, names);
+}
+
+std::vector<Profile> profilesOf(const Options& options, const Installation& installation) {
+  std::vector<Profile> profiles;
+  if (!options.withoutProfile && options.profile.empty()) {
+    profiles.push_back(readProfile(installation.defaultProfile()));
+    profiles.back().mayNameOthers = true;  // it is for whatever plug-ins may be loaded
+  }
+  if (options.recorded) profiles.push_back(*options.recorded);
+  if (!options.withoutProfile && !options.profile.empty()) profiles.push_back(readProfile(options.profile));
+  for (const std::filesystem::path& file : options.parameterFiles) profiles.push_back(readProfile(file));
+  return profiles;
+}
+
+// Asks for the descriptions without which the profiles cannot be checked.
+void describeDoubts(const Options& options, const Installation& installation, const std::vector<Profile>& profiles,
+                    std::vector<DescribedDiagnostic>& catalogue) {
+  std::vector<Diagnostic> doubts;
+  for (const Profile& profile : profiles) {
+    const std::vector<Diagnostic> more = inDoubt(profile, catalogue);
+    doubts.insert(doubts.end(), more.begin(), more.end());
+  }
+  if (doubts.empty()) return;
+  if (options.inProcess) {  // where they are loaded already
+    for (DescribedDiagnostic& one : catalogue) {
+      if (contains(doubts, one.diagnostic)) one.description = describeDiagnostic(one.diagnostic);
+    }
+    return;
+  }
+  const Survey survey =
+      surveyOf(options, installation, [&doubts](const std::vector<Diagnostic>& /*catalogue*/) { return doubts; });
+  for (DescribedDiagnostic& one : catalogue) {
+    for (const DescribedDiagnostic& asked : survey.catalogue) {
+      if (asked.description.isAsked && contains({asked.diagnostic}, one.diagnostic))
+        one.description = asked.description;
+    }
+  }
+}
+
+}  // namespace
+
+IsolationOptions isolationOf(const Options& options, const Installation& installation) {
+  IsolationOptions isolation{options.plugins, options.memory, options.deadlines};
+  if (isolation.plugins.empty()) isolation.plugins.push_back(installation.defaultPlugin());
+  return isolation;
+}
+
+Survey surveyOf(const Options& options, const Installation& installation, const DiagnosticChoice& described) {
+  const IsolationOptions isolation = isolationOf(options, installation);
+  Survey survey;
+  if (options.inProcess) {
+    loadPlugins(isolation.plugins);
+    const std::vector<Diagnostic> catalogue = catalogueOf(QZLab::defaultLab());
+    const std::vector<Diagnostic> wanted = described(catalogue);
+    for (const Diagnostic& one : catalogue) survey.catalogue.push_back({one, describeIfWanted(one, wanted)});
+    return survey;
+  }
+  WatchedSignals signals;
+  survey = surveyPlugins(isolation, signals, described);
+  if (survey.interrupted) throw Refusal(ExitCode::kInterrupted, "interrupted while the plug-ins were loaded");
+  return survey;
+}
+
+Survey surveyForSelection(const Options& options, const Installation& installation) {
+  return surveyOf(options, installation,
+                  [&options](const std::vector<Diagnostic>& catalogue) { return wantedOf(catalogue, options, true); });
+}
+
+Selection select(const Options& options, const Installation& installation) {
+  Survey survey = surveyForSelection(options, installation);
+  std::vector<DescribedDiagnostic>& described = survey.catalogue;
+  std::vector<Diagnostic> catalogue;
+  catalogue.reserve(described.size());
+  for (const DescribedDiagnostic& one : described) catalogue.push_back(one.diagnostic);
+
+  const std::vector<Diagnostic> wanted = wantedOf(catalogue, options, !survey.failed.empty());
+  const std::vector<Profile> profiles = profilesOf(options, installation);
+  describeDoubts(options, installation, profiles, described);
+  for (const Profile& profile : profiles) checkProfile(profile, described);
+  std::vector<Setting> settings = settingsOfEnvironment();
+  settings.insert(settings.end(), options.settings.begin(), options.settings.end());
+  std::vector<DescribedDiagnostic> selected;
+  for (const Diagnostic& one : wanted) {
+    for (const DescribedDiagnostic& candidate : described) {
+      const Diagnostic& other = candidate.diagnostic;
+      if (other.name == one.name && other.experimentOnly == one.experimentOnly) selected.push_back(candidate);
+    }
+  }
+  if (!selected.empty()) checkSettings(settings, selected);
+  Selection selection{{}, std::move(survey.failed)};
+  for (DescribedDiagnostic& one : selected) {
+    BoundParameters parameters = bindParameters(one, profiles, settings);
+    selection.diagnostics.push_back({std::move(one), std::move(parameters)});
+  }
+  return selection;
+}
+
+}  // namespace quazor

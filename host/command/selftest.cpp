@@ -1,0 +1,203 @@
+#include "host/command/selftest.h"
+
+#include "contract/message_format.h"
+#include "contract/ordered_map.h"
+#include "host/error/host_error.h"
+#include "host/report/sample_images.h"
+#include "host/text/table.h"
+
+#include <algorithm>
+#include <cstddef>
+#include <string_view>
+
+namespace quazor {
+
+using Json = nlohmann::ordered_json;
+
+namespace {
+
+bool isOfHost(const DiagnosticErrorPtr& error) { return error != nullptr && error->domain() == QuazorHostErrorDomain; }
+
+std::string errorText(const std::optional<ExpectedError>& error) {
+  return error ? formatMessage("%@ code %@: %@", error->domain, error->code, error->message) : std::string("no error");
+}
+
+std::optional<ExpectedError> partsOf(const DiagnosticErrorPtr& error) {
+  if (error == nullptr) return std::nullopt;
+  return ExpectedError{error->domain(), error->code(), error->localizedDescription()};
+}
+
+std::string listText(const std::vector<std::string>& names) {
+  std::string text;
+  for (const std::string& name : names) text += (text.empty() ? "" : ", ") + name;
+  return text.empty() ? "none" : text;
+}
+
+std::vector<std::string> failedResultsOf(const DiagnosticRecord& record) {
+  std::vector<std::string> names;
+  for (const auto& [result, verdict] : record.measuredResults) {
+    if (verdict == ResultVerdict::kFail) names.push_back(result.name());
+  }
+  return names;
+}
+
+std::size_t imagesIn(const DiagnosticRecord& record) {
+  const Value* const images = record.auxiliaryData.find("images");
+  return images == nullptr || images->array() == nullptr ? 0 : images->array()->size();
+}
+
+// What of the outcome is compared, as expected and as it is.
+struct Comparison {
+  std::string_view what;
+  std::string expected;
+  std::string outcome;
+};
+
+// What a table counts for one diagnostic.
+struct Counts {
+  std::size_t faulty = 0;
+  std::size_t detected = 0;
+  std::size_t healthy = 0;
+  std::size_t falseAlarms = 0;
+  std::size_t invalid = 0;
+};
+
+OrderedMap<Counts> countsOf(const std::vector<SelftestRow>& rows, const std::vector<SelftestVerdict>& verdicts) {
+  OrderedMap<Counts> all;
+  for (std::size_t i = 0; i < rows.size(); ++i) {
+    const std::string& name = rows[i].expected.name;
+    if (!all.contains(name)) all.set(name, {});
+    Counts& counts = *all.find(name);
+    const bool healthy = rows[i].expected.verdict == "pass";
+    ++(healthy ? counts.healthy : counts.faulty);
+    if (verdicts[i] == SelftestVerdict::kDetected) ++counts.detected;
+    if (verdicts[i] == SelftestVerdict::kFalseAlarm) ++counts.falseAlarms;
+    if (verdicts[i] == SelftestVerdict::kInvalid) ++counts.invalid;
+  }
+  return all;
+}
+
+std::size_t phonesIn(const std::vector<SelftestRow>& rows) {
+  OrderedMap<bool> phones;
+  for (const SelftestRow& row : rows) phones.set(row.scenario, true);
+  return phones.size();
+}
+
+}  // namespace
+
+std::string_view nameOf(SelftestVerdict verdict) {
+  switch (verdict) {
+    case SelftestVerdict::kPassed: return "passed";
+    case SelftestVerdict::kDetected: return "detected";
+    case SelftestVerdict::kMissed: return "MISSED";
+    case SelftestVerdict::kFalseAlarm: return "FALSE ALARM";
+    case SelftestVerdict::kDifferent: return "DIFFERENT";
+    case SelftestVerdict::kInvalid: break;
+  }
+  return "INVALID";
+}
+
+std::string differenceOf(const ExpectedOutcome& expected, const DiagnosticRecord& record) {
+  // The host's own words for a run that gave no error say nothing of the phone.
+  const bool hostsWord = isOfHost(record.error) && !expected.error;
+  const DiagnosticErrorPtr error = hostsWord ? nullptr : record.error;
+  std::vector<Comparison> comparisons = {
+      {"the verdict", expected.verdict, std::string(nameOf(record.verdict))},
+      {"the error", errorText(expected.error), errorText(partsOf(error))},
+      {"the failed results", listText(expected.failedResults), listText(failedResultsOf(record))}};
+  if (expected.underlying) {
+    const DiagnosticErrorPtr underlying = error == nullptr ? nullptr : error->underlyingError();
+    comparisons.push_back({"the underlying error", errorText(expected.underlying), errorText(partsOf(underlying))});
+  }
+  if (expected.images) {
+    comparisons.push_back({"the images", std::to_string(*expected.images), std::to_string(imagesIn(record))});
+  }
+  for (const auto& [what, wanted, outcome] : comparisons) {
+    if (wanted != outcome) return formatMessage("%@: expected %@, got %@", what, wanted, outcome);
+  }
+  return {};
+}
+
+std::vector<SelftestVerdict> verdictsOf(const std::vector<SelftestRow>& rows) {
+  OrderedMap<std::vector<std::uint64_t>> fired;
+  for (const SelftestRow& row : rows) {
+    if (!fired.contains(row.scenario)) fired.set(row.scenario, {});
+    std::vector<std::uint64_t>& counts = *fired.find(row.scenario);
+    counts.resize(std::max(counts.size(), row.faultsFired.size()));
+    for (std::size_t i = 0; i < row.faultsFired.size(); ++i) counts[i] += row.faultsFired[i];
+  }
+  std::vector<SelftestVerdict> verdicts;
+  for (const SelftestRow& row : rows) {
+    const std::vector<std::uint64_t>& counts = *fired.find(row.scenario);
+    const bool healthy = row.expected.verdict == "pass";
+    if (row.runs == 0 || std::find(counts.begin(), counts.end(), 0U) != counts.end()) {
+      verdicts.push_back(SelftestVerdict::kInvalid);
+    } else if (!healthy && row.passes > 0) {
+      verdicts.push_back(SelftestVerdict::kMissed);
+    } else if (healthy && row.passes < row.runs) {
+      verdicts.push_back(SelftestVerdict::kFalseAlarm);
+    } else if (row.asExpected < row.runs) {
+      verdicts.push_back(SelftestVerdict::kDifferent);
+    } else {
+      verdicts.push_back(healthy ? SelftestVerdict::kPassed : SelftestVerdict::kDetected);
+    }
+  }
+  return verdicts;
+}
+
+bool isAllRight(const std::vector<SelftestVerdict>& verdicts) {
+  return std::all_of(verdicts.begin(), verdicts.end(), [](SelftestVerdict one) {
+    return one == SelftestVerdict::kPassed || one == SelftestVerdict::kDetected;
+  });
+}
+
+void printSelftest(std::ostream& out, const std::vector<SelftestRow>& rows, std::uint64_t seeds) {
+  using Align = Table::Align;
+  const std::vector<SelftestVerdict> verdicts = verdictsOf(rows);
+  Table table({Align::kLeft, Align::kLeft, Align::kLeft, Align::kRight, Align::kLeft});
+  table.addRow({"Phone", "Run", "Expected", "As expected", "Outcome"});
+  for (std::size_t i = 0; i < rows.size(); ++i) {
+    const SelftestRow& row = rows[i];
+    table.addRow({printable(row.scenario), printable(row.expected.name), row.expected.verdict,
+                  formatMessage("%@ of %@", row.asExpected, row.runs), std::string(nameOf(verdicts[i]))});
+  }
+  table.print(out, "");
+  for (std::size_t i = 0; i < rows.size(); ++i) {
+    if (rows[i].difference.empty()) continue;
+    out << '\n'
+        << printable(rows[i].scenario) << ", " << printable(rows[i].expected.name) << ": "
+        << printable(rows[i].difference) << '\n';
+  }
+  out << '\n';
+  Table matrix({Align::kLeft, Align::kRight, Align::kRight, Align::kRight});
+  matrix.addRow({"Run", "Detected", "False alarms", "Invalid"});
+  for (const auto& [name, counts] : countsOf(rows, verdicts)) {
+    matrix.addRow({printable(name), formatMessage("%@ of %@", counts.detected, counts.faulty),
+                   formatMessage("%@ of %@", counts.falseAlarms, counts.healthy), std::to_string(counts.invalid)});
+  }
+  matrix.print(out, "");
+  out << formatMessage("\nPhones: %@, runs: %@, seeds of each: %@; %@\n", phonesIn(rows), rows.size(), seeds,
+                       isAllRight(verdicts) ? "all as expected" : "NOT all as expected");
+}
+
+Json selftestDocument(const std::vector<SelftestRow>& rows, std::uint64_t seeds) {
+  const std::vector<SelftestVerdict> verdicts = verdictsOf(rows);
+  Json json = Json::array();
+  for (std::size_t i = 0; i < rows.size(); ++i) {
+    const SelftestRow& row = rows[i];
+    std::string outcome(nameOf(verdicts[i]));
+    std::transform(outcome.begin(), outcome.end(), outcome.begin(),
+                   [](char unit) { return unit >= 'A' && unit <= 'Z' ? static_cast<char>(unit - 'A' + 'a') : unit; });
+    json.push_back({{"phone", row.scenario},
+                    {"name", row.expected.name},
+                    {"expected", row.expected.verdict},
+                    {"runs", row.runs},
+                    {"asExpected", row.asExpected},
+                    {"outcome", outcome},
+                    {"difference", row.difference.empty() ? Json() : Json(row.difference)},
+                    {"faultsFired", row.faultsFired}});
+  }
+  return {{"schema", 1}, {"seeds", seeds}, {"allAsExpected", isAllRight(verdicts)}, {"rows", std::move(json)}};
+}
+
+}  // namespace quazor

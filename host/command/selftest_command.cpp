@@ -1,0 +1,144 @@
+#include "host/command/selftest_command.h"
+
+#include "base/text/nearest_name.h"
+#include "contract/message_format.h"
+#include "host/command/answer.h"
+#include "host/command/selection.h"
+#include "host/command/selftest.h"
+#include "host/model/record_builder.h"
+#include "host/record/value_json.h"
+#include "host/text/timestamp.h"
+
+#include <algorithm>
+#include <sstream>
+#include <utility>
+
+namespace quazor {
+
+namespace {
+
+std::vector<std::string> wantedScenarios(const Options& options, const Installation& installation) {
+  const std::vector<std::string> all = installation.scenarioNames();
+  if (options.names.empty()) return all;
+  std::vector<std::string> wanted;
+  for (const std::string& name : options.names) {
+    const std::size_t before = wanted.size();
+    for (const std::string& one : all) {
+      if (matchesName(name, one) && std::find(wanted.begin(), wanted.end(), one) == wanted.end()) wanted.push_back(one);
+    }
+    const bool found = wanted.size() > before || std::find(wanted.begin(), wanted.end(), name) != wanted.end();
+    if (!found) throw Refusal(ExitCode::kUsage, "there is no installed phone '" + name + "'" + didYouMean(name, all));
+  }
+  return wanted;
+}
+
+class Selftest {
+ public:
+  Selftest(const Options& options, const Installation& installation, Console& console)
+      : options_(withAllPlugins(options, installation)),
+        installation_(installation),
+        survey_(surveyOf(options_, installation, [](const std::vector<Diagnostic>& all) { return all; })),
+        isolation_(withoutFailed(isolationOf(options_, installation), survey_.failed)),
+        progress_(console.showsProgress ? &console.err : nullptr) {
+    profile_ = readProfile(installation.defaultProfile());
+    if (!options_.inProcess) signals_.emplace();
+  }
+
+  std::vector<SelftestRow> perform() {
+    std::vector<SelftestRow> rows;
+    for (const std::string& name : wantedScenarios(options_, installation_)) {
+      const std::filesystem::path file = installation_.scenario(name);
+      for (const ExpectedOutcome& expected : summaryOfScenario(file).expected) {
+        SelftestRow row{name, expected, 0, 0, 0, {}, {}};
+        for (std::uint64_t seed = 0; seed < options_.seeds; ++seed) {
+          count(row, run(file, expected, seed));
+          if (signals_ && signals_->requestsToEnd() > 0) throw Refusal(ExitCode::kInterrupted, "interrupted");
+        }
+        rows.push_back(std::move(row));
+      }
+    }
+    return rows;
+  }
+
+ private:
+  static Options withAllPlugins(Options options, const Installation& installation) {
+    if (options.plugins.empty()) options.plugins = installation.allPlugins();
+    return options;
+  }
+
+  static void count(SelftestRow& row, const DiagnosticRecord& record) {
+    ++row.runs;
+    if (record.verdict == Verdict::kPass) ++row.passes;
+    const std::string difference = differenceOf(row.expected, record);
+    if (difference.empty()) {
+      ++row.asExpected;
+    } else if (row.difference.empty()) {
+      row.difference = "seed " + std::to_string(record.seed) + ": " + difference;
+    }
+    row.faultsFired.resize(std::max(row.faultsFired.size(), record.faults.size()));
+    for (std::size_t i = 0; i < record.faults.size(); ++i) row.faultsFired[i] += record.faults[i].fired;
+  }
+
+  const DescribedDiagnostic& find(const ExpectedOutcome& expected) const {
+    for (const DescribedDiagnostic& one : survey_.catalogue) {
+      const Diagnostic& diagnostic = one.diagnostic;
+      if (diagnostic.name == expected.name && diagnostic.experimentOnly == expected.experimentOnly) return one;
+    }
+    throw Refusal(ExitCode::kCannotRead, "the plug-ins have no " + expected.name + ", which an installed phone is for");
+  }
+
+  BoundParameters parametersOf(const DescribedDiagnostic& described, const ExpectedOutcome& expected) const {
+    if (!expected.experimentOnly) return bindParameters(described, {profile_}, {});
+    std::vector<Setting> settings;
+    for (const auto& [name, value] : expected.parameters) {
+      // As it would stand on a command line: a whole number is an integer.
+      settings.push_back(parseSetting(formatMessage("%@=%@", name, value)));
+    }
+    return bindParameters(described, {}, settings);
+  }
+
+  DiagnosticRecord run(const std::filesystem::path& file, const ExpectedOutcome& expected, std::uint64_t seed) {
+    const DescribedDiagnostic& described = find(expected);
+    const Diagnostic& diagnostic = described.diagnostic;
+    const BoundParameters parameters = parametersOf(described, expected);
+    RunOptions runOptions;
+    runOptions.makePhone = phonesOfScenario(file, false, seed);
+    runOptions.logLevel = LogLevel::kError;
+    RecordBuilder builder;
+    builder.take(DiagnosticBegan{diagnostic.name, described.summary(), diagnostic.experimentName,
+                                 diagnostic.analysisName, diagnostic.experimentOnly, parameters, seed, dateNow()});
+    progress_.start(file.stem().string(), {});
+    if (options_.inProcess) {
+      runDiagnostic(diagnostic, parameters, runOptions, builder);
+    } else {
+      runIsolated(isolation_, *signals_, diagnostic, parameters, runOptions, nullptr, progress_, builder);
+    }
+    progress_.stop();
+    for (const RunEvent& event : builder.ending(dateNow())) builder.take(event);
+    return builder.takeRecord();
+  }
+
+  const Options options_;
+  const Installation& installation_;
+  const Survey survey_;
+  const IsolationOptions isolation_;
+  Progress progress_;
+  Profile profile_;
+  std::optional<WatchedSignals> signals_;
+};
+
+}  // namespace
+
+ExitCode selftestCommand(const Options& options, const Installation& installation, Console& console) {
+  const std::vector<SelftestRow> rows = Selftest(options, installation, console).perform();
+  std::ostringstream text;
+  if (options.report.format == Format::kJson) {
+    text << documentText(selftestDocument(rows, options.seeds));
+  } else {
+    printSelftest(text, rows, options.seeds);
+  }
+  writeAnswer(options.report, console, text.str());
+  return isAllRight(verdictsOf(rows)) ? ExitCode::kAllPassed : ExitCode::kFailed;
+}
+
+}  // namespace quazor

@@ -1,0 +1,133 @@
+#include "host/command/selftest.h"
+
+#include "host/error/host_error.h"
+#include "host/testing/test_records.h"
+
+#include <gmock/gmock.h>
+#include <gtest/gtest.h>
+
+#include <sstream>
+
+namespace quazor {
+namespace {
+
+using testing::ElementsAre;
+using testing::HasSubstr;
+
+ExpectedOutcome passes() { return {"Name", false, {}, "pass", std::nullopt, std::nullopt, {}, std::nullopt}; }
+
+ExpectedOutcome errs() {
+  ExpectedOutcome outcome = passes();
+  outcome.verdict = "error";
+  outcome.error = ExpectedError{"Domain", -1, "it failed"};
+  return outcome;
+}
+
+SelftestRow row(const std::string& scenario, ExpectedOutcome expected, std::uint64_t asExpected, std::uint64_t passed,
+                std::vector<std::uint64_t> fired) {
+  return {scenario, std::move(expected), 3, asExpected, passed, asExpected < 3 ? "it differs" : "", std::move(fired)};
+}
+
+TEST(DifferenceOf, IsNothingForWhatIsExpected) {
+  EXPECT_EQ(differenceOf(passes(), recordOf("Name", Verdict::kPass)), "");
+  EXPECT_EQ(differenceOf(errs(), recordOf("Name", Verdict::kError)), "");
+  ExpectedOutcome fails = passes();
+  fails.verdict = "fail";
+  fails.failedResults = {"Count"};
+  EXPECT_EQ(differenceOf(fails, recordOf("Name", Verdict::kFail)), "");
+}
+
+TEST(DifferenceOf, TellsTheFirstThatIsNotAsExpected) {
+  EXPECT_EQ(differenceOf(passes(), recordOf("Name", Verdict::kError)), "the verdict: expected pass, got error");
+  ExpectedOutcome fails = passes();
+  fails.verdict = "fail";
+  fails.failedResults = {"Other", "Count"};
+  EXPECT_EQ(differenceOf(fails, recordOf("Name", Verdict::kFail)),
+            "the failed results: expected Other, Count, got Count");
+  for (const ExpectedError& error : {ExpectedError{"Else", -1, "it failed"}, ExpectedError{"Domain", 1, "it failed"},
+                                     ExpectedError{"Domain", -1, "it broke"}}) {
+    ExpectedOutcome outcome = errs();
+    outcome.error = error;
+    EXPECT_THAT(differenceOf(outcome, recordOf("Name", Verdict::kError)),
+                testing::AllOf(HasSubstr("the error: expected "), HasSubstr("got Domain code -1: it failed")));
+  }
+}
+
+TEST(DifferenceOf, LooksAtTheUnderlyingErrorAndTheImagesWhereTheyAreExpected) {
+  ExpectedOutcome outcome = errs();
+  outcome.underlying = ExpectedError{"Deep", 2, "the cause"};
+  EXPECT_EQ(differenceOf(outcome, recordOf("Name", Verdict::kError)), "");
+  outcome.underlying->code = 3;
+  EXPECT_EQ(differenceOf(outcome, recordOf("Name", Verdict::kError)),
+            "the underlying error: expected Deep code 3: the cause, got Deep code 2: the cause");
+  ExpectedOutcome images = passes();
+  images.images = 2;
+  DiagnosticRecord record = recordOf("Name", Verdict::kPass);
+  EXPECT_EQ(differenceOf(images, record), "the images: expected 2, got 0");
+  record.auxiliaryData.set("images", Array{1, 2});
+  EXPECT_EQ(differenceOf(images, record), "");
+}
+
+TEST(DifferenceOf, TakesTheHostsWordsForNoErrorUnlessTheyAreExpected) {
+  DiagnosticRecord record = recordOf("Name", Verdict::kError);
+  record.error = hostError(HostErrorCode::kNoErrorGiven, "it failed without giving an error");
+  ExpectedOutcome outcome = errs();
+  outcome.error.reset();
+  EXPECT_EQ(differenceOf(outcome, record), "");
+  outcome.error = ExpectedError{std::string(QuazorHostErrorDomain), 1, "it failed without giving an error"};
+  EXPECT_EQ(differenceOf(outcome, record), "");
+}
+
+TEST(SelftestVerdicts, TellDetectionsFromMissesAndFalseAlarms) {
+  const std::vector<SelftestRow> rows = {row("healthy", passes(), 3, 3, {}),  row("faulty", errs(), 3, 0, {1}),
+                                         row("missed", errs(), 2, 1, {3}),    row("alarm", passes(), 2, 2, {}),
+                                         row("different", errs(), 1, 0, {1}), row("invalid", errs(), 3, 0, {1, 0}),
+                                         row("not run", {}, 3, 3, {})};
+  std::vector<SelftestRow> all = rows;
+  all.back().runs = 0;
+  EXPECT_THAT(verdictsOf(all),
+              ElementsAre(SelftestVerdict::kPassed, SelftestVerdict::kDetected, SelftestVerdict::kMissed,
+                          SelftestVerdict::kFalseAlarm, SelftestVerdict::kDifferent, SelftestVerdict::kInvalid,
+                          SelftestVerdict::kInvalid));
+  EXPECT_FALSE(isAllRight(verdictsOf(all)));
+  EXPECT_TRUE(isAllRight(verdictsOf({rows[0], rows[1]})));
+}
+
+TEST(SelftestVerdicts, CountThePhonesFaultsInAllOfItsRowsTogether) {
+  const std::vector<SelftestRow> rows = {row("phone", errs(), 3, 0, {3, 0}), row("phone", passes(), 3, 3, {0, 1}),
+                                         row("other", errs(), 3, 0, {0})};
+  EXPECT_THAT(verdictsOf(rows),
+              ElementsAre(SelftestVerdict::kDetected, SelftestVerdict::kPassed, SelftestVerdict::kInvalid));
+}
+
+TEST(Selftest, PrintsEveryRowAndTheMatrix) {
+  const std::vector<SelftestRow> rows = {row("healthy", passes(), 3, 3, {}), row("faulty", errs(), 3, 0, {1}),
+                                         row("missed", errs(), 2, 1, {3})};
+  std::ostringstream out;
+  printSelftest(out, rows, 3);
+  EXPECT_EQ(out.str(),
+            "Phone    Run   Expected  As expected  Outcome\n"
+            "healthy  Name  pass           3 of 3  passed\n"
+            "faulty   Name  error          3 of 3  detected\n"
+            "missed   Name  error          2 of 3  MISSED\n"
+            "\n"
+            "missed, Name: it differs\n"
+            "\n"
+            "Run   Detected  False alarms  Invalid\n"
+            "Name    1 of 2        0 of 1        0\n"
+            "\n"
+            "Phones: 3, runs: 3, seeds of each: 3; NOT all as expected\n");
+}
+
+TEST(Selftest, IsADocumentToo) {
+  const nlohmann::ordered_json document = selftestDocument({row("missed", errs(), 2, 1, {3})}, 3);
+  EXPECT_EQ(document["allAsExpected"], false);
+  EXPECT_EQ(document["rows"][0]["outcome"], "missed");
+  EXPECT_EQ(document["rows"][0]["difference"], "it differs");
+  EXPECT_EQ(document["rows"][0]["faultsFired"][0], 3);
+  EXPECT_EQ(selftestDocument({row("alarm", passes(), 2, 2, {})}, 3)["rows"][0]["outcome"], "false alarm");
+  EXPECT_TRUE(selftestDocument({row("healthy", passes(), 3, 3, {})}, 3)["rows"][0]["difference"].is_null());
+}
+
+}  // namespace
+}  // namespace quazor

@@ -1,0 +1,101 @@
+// Phones to run diagnostics on. phone.cpp is the only place that names the backend that stands behind them.
+#pragma once
+
+#include "contract/log_channel.h"
+#include "contract/ordered_map.h"
+#include "platform/platform.h"
+
+#include <nlohmann/json.hpp>
+
+#include <cstdint>
+#include <filesystem>
+#include <functional>
+#include <memory>
+#include <optional>
+#include <string>
+#include <string_view>
+#include <vector>
+
+namespace quazor {
+
+// A fault that the phone was told to have, as its scenario has it, and how many calls it changed.
+struct DeclaredFault {
+  nlohmann::ordered_json fault;
+  std::uint64_t fired = 0;
+};
+
+// One phone, for one run. Its platform's services may outlive it.
+class Phone {
+ public:
+  Phone() = default;
+  Phone(const Phone&) = delete;
+  Phone& operator=(const Phone&) = delete;
+  virtual ~Phone() = default;
+
+  virtual Platform platform() const = 0;
+  virtual std::vector<DeclaredFault> faults() const = 0;
+  // How many frames its cameras have handed to handlers. Any thread.
+  virtual std::uint64_t framesDelivered() const = 0;
+};
+
+// Makes a new phone on every call, each like the first.
+using PhoneMaker = std::function<std::unique_ptr<Phone>()>;
+
+// Reads a scenario file and gives the maker of the phones it describes: in virtual time, or in real time when
+// `realTime`. One seed is one course of events in virtual time. Makes no phone itself. Throws a Refusal (kCannotRead)
+// with the reader's sentence when the file cannot be read.
+PhoneMaker phonesOfScenario(const std::filesystem::path& file, bool realTime, std::uint64_t seed);
+
+// The parts of an error that an outcome is expected to have.
+struct ExpectedError {
+  std::string domain;
+  std::int64_t code = 0;
+  std::string message;
+};
+
+// What a run on a phone is expected to end in.
+struct ExpectedOutcome {
+  std::string name;             // of the diagnostic, or of the experiment that is run alone
+  bool experimentOnly = false;  // then `parameters` are all that it is set up with
+  OrderedMap<double> parameters;
+  std::string verdict;                      // by its name
+  std::optional<ExpectedError> error;       // nothing: none, but for the host's own words
+  std::optional<ExpectedError> underlying;  // nothing: not looked at
+  std::vector<std::string> failedResults;
+  std::optional<std::uint64_t> images;  // how many the auxiliary data holds; nothing: not looked at
+};
+
+struct ScenarioSummary {
+  std::string title;
+  std::vector<ExpectedOutcome> expected;
+  bool hasFaults = false;
+};
+
+// A phone's name that begins so is the machine that quazor runs on; what follows names the binding file.
+inline constexpr std::string_view kLinuxPrefix = "linux:";
+
+// The FILE of "linux:FILE"; nothing for other names of phones, which are scenarios'.
+std::optional<std::filesystem::path> bindingNamed(const std::filesystem::path& phone);
+
+// Reads a binding file and gives the maker of this machine as a phone, which is always the same one, in real time.
+// Throws a Refusal (kCannotRead) with the reader's sentence when the file cannot be read.
+PhoneMaker phonesOfBinding(const std::filesystem::path& file);
+
+// What this machine has for a binding to name: for people, line by line, and a binding to start from, a file's text.
+struct PhoneProbe {
+  std::vector<std::string> lines;  // may hold any character that a device gives
+  std::string binding;
+};
+PhoneProbe probeThisMachine();
+
+// True of the name of a process that a phone leaves behind to put its hardware in order, as a light that must not stay
+// on; it ends by itself, soon.
+bool isCleanupProcess(std::string_view processName);
+
+// Where this machine keeps log lines: its journal, or syslog(3) where there is none.
+std::shared_ptr<LogBackend> systemLogOfThisMachine();
+
+// What a scenario file says of itself. Throws a Refusal (kCannotRead) when the file cannot be read.
+ScenarioSummary summaryOfScenario(const std::filesystem::path& file);
+
+}  // namespace quazor

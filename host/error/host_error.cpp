@@ -1,0 +1,24 @@
+#include "host/error/host_error.h"
+
+#include <utility>
+
+namespace quazor {
+
+DiagnosticErrorPtr hostError(HostErrorCode code, std::string message) {
+  return errorWithMessage(QuazorHostErrorDomain, static_cast<std::int64_t>(code), std::move(message), nullptr);
+}
+
+DiagnosticErrorPtr errorOfException(std::string_view operation, const std::exception_ptr& thrown) {
+  std::string message(operation);
+  try {
+    std::rethrow_exception(thrown);
+  } catch (const std::exception& exception) {
+    message += " threw an exception: ";
+    message += exception.what();
+  } catch (...) {
+    message += " threw something that is not a standard exception";
+  }
+  return hostError(HostErrorCode::kException, std::move(message));
+}
+
+}  // namespace quazor

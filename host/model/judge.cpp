@@ -1,0 +1,103 @@
+#include "host/model/judge.h"
+
+#include "contract/message_format.h"
+
+#include <cmath>
+#include <utility>
+
+namespace quazor {
+
+namespace {
+
+// Why the bound cannot be compared with the measurement; empty when it can.
+std::string problemOfBound(std::string_view which, const QZBound& bound, const Measurement& measured) {
+  const Measurement& value = bound.value();
+  if (!std::isfinite(value.value())) return formatMessage("its %@ bound is %@", which, value.value());
+  if (&value.unit() != &measured.unit()) {
+    return formatMessage("its %@ bound is in '%@' and its value in '%@'", which, value.unit().symbol(),
+                         measured.unit().symbol());
+  }
+  return {};
+}
+
+std::string problemOfLimit(const QZLimit& limit, const Measurement& measured) {
+  const QZBound* lower = limit.lowerBound().get();
+  const QZBound* upper = limit.upperBound().get();
+  if (lower != nullptr) {
+    if (std::string problem = problemOfBound("lower", *lower, measured); !problem.empty()) return problem;
+  }
+  if (upper != nullptr) {
+    if (std::string problem = problemOfBound("upper", *upper, measured); !problem.empty()) return problem;
+  }
+  if (lower != nullptr && upper != nullptr) {
+    const double low = lower->value().value();
+    const double high = upper->value().value();
+    if (low > high || (low == high && (lower->open() || upper->open()))) return "no value can lie between its bounds";
+  }
+  if (!std::isfinite(measured.value())) return formatMessage("its value is %@", measured.value());
+  return {};
+}
+
+bool isInside(const QZLimit& limit, double value) {
+  if (const QZBound* lower = limit.lowerBound().get()) {
+    const double low = lower->value().value();
+    if (value < low || (value == low && lower->open())) return false;
+  }
+  if (const QZBound* upper = limit.upperBound().get()) {
+    const double high = upper->value().value();
+    if (value > high || (value == high && upper->open())) return false;
+  }
+  return true;
+}
+
+}  // namespace
+
+std::string_view nameOf(ResultVerdict verdict) {
+  switch (verdict) {
+    case ResultVerdict::kPass: return "pass";
+    case ResultVerdict::kFail: return "fail";
+    case ResultVerdict::kNone: break;
+  }
+  return "none";
+}
+
+std::string_view nameOf(Verdict verdict) {
+  switch (verdict) {
+    case Verdict::kPass: return "pass";
+    case Verdict::kFail: return "fail";
+    case Verdict::kError: break;
+  }
+  return "error";
+}
+
+ResultJudgement judgeResult(const QZMeasuredResult& result) {
+  const std::optional<QZLimit>& limit = result.limit();
+  if (!limit || (limit->lowerBound() == nullptr && limit->upperBound() == nullptr)) return {};
+  if (const std::string problem = problemOfLimit(*limit, result.measurement()); !problem.empty()) {
+    return {ResultVerdict::kFail, formatMessage("the result %@ cannot be judged: %@", result.name(), problem)};
+  }
+  return {isInside(*limit, result.measurement().value()) ? ResultVerdict::kPass : ResultVerdict::kFail, {}};
+}
+
+Judgement judge(const std::vector<QZMeasuredResult>& results) {
+  Judgement judgement;
+  if (results.empty()) {
+    judgement.problemCode = HostErrorCode::kNothingMeasured;
+    judgement.problem = "nothing was measured";
+    return judgement;
+  }
+  judgement.verdict = Verdict::kPass;
+  for (const QZMeasuredResult& result : results) {
+    ResultJudgement one = judgeResult(result);
+    judgement.results.push_back(one.verdict);
+    if (one.verdict == ResultVerdict::kFail && judgement.verdict == Verdict::kPass) judgement.verdict = Verdict::kFail;
+    if (!one.problem.empty() && judgement.problem.empty()) {
+      judgement.problemCode = HostErrorCode::kCannotBeJudged;
+      judgement.problem = std::move(one.problem);
+    }
+  }
+  if (judgement.problemCode) judgement.verdict = Verdict::kError;
+  return judgement;
+}
+
+}  // namespace quazor

@@ -1,0 +1,108 @@
+// RunEvent: what a run tells while it goes on. Every report and record is made from these events alone.
+#pragma once
+
+#include "contract/results.h"
+#include "host/model/diagnostic_record.h"
+
+#include <chrono>
+#include <cstdint>
+#include <optional>
+#include <string>
+#include <utility>
+#include <variant>
+#include <vector>
+
+namespace quazor {
+
+// The first event: what is run, with what, on what.
+struct RunBegan {
+  std::string program;  // the version of quazor
+  int contract = 0;     // the version of the plug-in contract
+  Date date{};
+  std::vector<std::string> plugins;  // files
+  std::string phone;                 // what it was made from
+  std::uint64_t seed = 0;
+  bool ofExperiments = false;      // of experiments on their own
+  std::vector<std::string> names;  // of what is to be run
+};
+
+struct DiagnosticBegan {
+  std::string name;
+  std::string summary;
+  std::string experimentName;
+  std::string analysisName;  // empty for an experiment on its own
+  bool experimentOnly = false;
+  BoundParameters parameters;
+  std::uint64_t seed = 0;
+  Date date{};
+};
+
+struct StageBegan {
+  Stage stage;
+  Date date{};
+};
+
+struct StageEnded {
+  Stage stage;
+  std::optional<std::chrono::nanoseconds> duration;  // by the phone's clock, where one ran
+  Date date{};
+};
+
+struct Logged {
+  LogLine line;
+};
+
+// Some of the measurements of the experiment's result, in its order.
+struct Measured {
+  std::vector<std::pair<std::string, Measurement>> measurements;
+};
+
+// An entry of the result's auxiliary data.
+struct Collected {
+  std::string key;
+  Value value;
+};
+
+// Some of the analysis' measured results, in its order.
+struct Found {
+  std::vector<QZMeasuredResult> results;
+};
+
+// A stage failed. Only the first failure of a diagnostic counts.
+struct Failed {
+  std::optional<Stage> stage;
+  DiagnosticErrorPtr error;
+};
+
+struct FaultsCounted {
+  std::vector<DeclaredFault> faults;
+};
+
+// The plug-in's part is over: whatever follows is the host's.
+struct DiagnosticCompleted {};
+
+struct DiagnosticEnded {
+  Verdict verdict = Verdict::kError;
+  Date date{};
+};
+
+struct RunEnded {
+  std::optional<std::string> interrupted;  // what was running when the run was interrupted; empty between two
+  Date date{};
+};
+
+using RunEvent = std::variant<RunBegan, DiagnosticBegan, StageBegan, StageEnded, Logged, Measured, Collected, Found,
+                              Failed, FaultsCounted, DiagnosticCompleted, DiagnosticEnded, RunEnded>;
+
+// Takes a run's events, in their order.
+class RunEventSink {
+ public:
+  RunEventSink() = default;
+  RunEventSink(const RunEventSink&) = delete;
+  RunEventSink& operator=(const RunEventSink&) = delete;
+  virtual ~RunEventSink() = default;
+
+  virtual void take(const RunEvent& event) = 0;
+};
+
+}  // namespace quazor

@@ -1,0 +1,45 @@
+// RunLog: the log lines of one run.
+#pragma once
+
+#include "contract/log_channel.h"
+#include "contract/value.h"
+#include "platform/clock.h"
+
+#include <chrono>
+#include <memory>
+#include <mutex>
+#include <string>
+#include <string_view>
+
+namespace quazor {
+
+class RunEventSink;
+
+std::string_view nameOf(LogLevel level);  // "error", "default", "debug"
+
+struct LogLine {
+  std::chrono::nanoseconds time{};  // since the run began, by the phone's clock
+  LogLevel level = LogLevel::kDefault;
+  std::string text;
+  Date date{};  // by the wall clock
+};
+
+// Tells every line as an event, until it is closed. Any thread.
+class RunLog final : public LogBackend {
+ public:
+  // The run begins now. `events` is borrowed until close(), and gets one line at a time.
+  RunLog(std::shared_ptr<const Clock> clock, RunEventSink& events);
+
+  void write(LogLevel level, std::string_view subsystem, std::string_view category, std::string_view text) override;
+
+  // What is written later is dropped.
+  void close();
+
+ private:
+  const std::shared_ptr<const Clock> clock_;
+  const std::chrono::nanoseconds begin_;
+  std::mutex mutex_;      // held while the sink takes a line
+  RunEventSink* events_;  // guarded by mutex_; null when closed
+};
+
+}  // namespace quazor

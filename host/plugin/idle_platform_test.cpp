@@ -1,0 +1,40 @@
+#include "host/plugin/idle_platform.h"
+
+#include <gtest/gtest.h>
+
+namespace quazor {
+namespace {
+
+using namespace std::chrono_literals;
+
+TEST(IdlePlatform, HasEveryServiceAndNothingBehindIt) {
+  const Platform platform = idlePlatform();
+  EXPECT_EQ(platform.capture->createPlugIn(), nullptr);
+  EXPECT_EQ(platform.capture->defaultPlugIn(), nullptr);
+  EXPECT_EQ(platform.reports->reportWithOnlySimpleChannels(nullptr), nullptr);
+  EXPECT_EQ(platform.hid->createManager(), nullptr);
+  EXPECT_EQ(platform.framebuffer->mainDisplay(), nullptr);
+  EXPECT_EQ(platform.runLoops->currentRunLoop(), nullptr);
+}
+
+TEST(IdlePlatform, NeverBlocks) {
+  const Platform platform = idlePlatform();
+  platform.clock->sleep(std::chrono::hours(1));
+  EXPECT_EQ(platform.clock->now(), 0ns);
+  EXPECT_EQ(platform.clock->date(), Date());
+  const std::shared_ptr<Semaphore> semaphore = platform.concurrency->makeSemaphore(0);
+  semaphore->wait();
+  semaphore->signal();
+}
+
+TEST(IdlePlatform, DestroysTasksWithoutRunningThem) {
+  const auto queue = idlePlatform().concurrency->makeSerialQueue("label", QualityOfService::kDefault);
+  const auto watched = std::make_shared<int>(0);
+  queue->async([watched] { ++*watched; });
+  queue->asyncAfter(1s, [watched] { ++*watched; });
+  EXPECT_EQ(watched.use_count(), 1);
+  EXPECT_EQ(*watched, 0);
+}
+
+}  // namespace
+}  // namespace quazor

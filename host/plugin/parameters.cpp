@@ -1,0 +1,264 @@
+#include "host/plugin/parameters.h"
+
+#include "base/text/nearest_name.h"
+#include "contract/message_format.h"
+#include "host/error/exit_code.h"
+#include "host/text/parameter_number.h"
+
+#include <algorithm>
+#include <cstdlib>
+#include <iterator>
+#include <sstream>
+
+namespace quazor {
+
+namespace {
+
+// How a setting is called in messages: where it stands, and its text.
+std::string quoted(SettingPlace place, const std::string& text) {
+  const std::string where = place == SettingPlace::kEnvironment ? kSettingsVariable : "--set";
+  return where + " '" + text + "'";
+}
+
+std::string_view sourceOf(SettingPlace place) {
+  return place == SettingPlace::kEnvironment ? "environment" : "command line";
+}
+
+constexpr Half kHalves[] = {Half::kExperiment, Half::kAnalysis};
+
+// What several of them are called.
+std::string nounOf(const std::vector<DescribedDiagnostic>& diagnostics) {
+  const auto isExperiment = [](const DescribedDiagnostic& one) { return one.diagnostic.experimentOnly; };
+  if (std::all_of(diagnostics.begin(), diagnostics.end(), isExperiment)) return "experiments";
+  if (std::any_of(diagnostics.begin(), diagnostics.end(), isExperiment)) return "diagnostics and experiments";
+  return "diagnostics";
+}
+
+const OrderedMap<QZNumberParameter>& declared(const DescribedDiagnostic& diagnostic, Half half) {
+  const DiagnosticDescription& description = diagnostic.description;
+  return (half == Half::kExperiment ? description.experiment : description.analysis).parameters();
+}
+
+bool sets(const Setting& setting, Half half, std::string_view name) {
+  return (!setting.half || *setting.half == half) && setting.name == name;
+}
+
+// The names that the diagnostics declare in that half or, without one, in any.
+std::vector<std::string> declaredNames(const std::vector<DescribedDiagnostic>& diagnostics, std::optional<Half> half) {
+  std::vector<std::string> names;
+  for (const DescribedDiagnostic& diagnostic : diagnostics) {
+    for (const Half one : kHalves) {
+      if (half && *half != one) continue;
+      for (const auto& [name, ignored] : declared(diagnostic, one)) names.push_back(name);
+    }
+  }
+  return names;
+}
+
+bool contains(const std::vector<std::string>& names, const std::string& name) {
+  return std::find(names.begin(), names.end(), name) != names.end();
+}
+
+// " (NAME could not be described: ...)" for the first such diagnostic: its parameters are not known.
+std::string noteOfUndescribed(const std::vector<DescribedDiagnostic>& diagnostics) {
+  for (const DescribedDiagnostic& one : diagnostics) {
+    if (one.description.error == nullptr) continue;
+    return " (" + one.diagnostic.name + " could not be described: " + one.description.error->localizedDescription() +
+           ")";
+  }
+  return {};
+}
+
+void checkEntry(const Profile& profile, const ProfileEntry& entry, const std::vector<DescribedDiagnostic>& matched) {
+  const bool allDescribed = std::all_of(matched.begin(), matched.end(), [](const DescribedDiagnostic& one) {
+    return one.description.isAsked && one.description.error == nullptr;
+  });
+  if (!allDescribed) return;
+  for (const Half half : kHalves) {
+    const std::vector<std::string> names = declaredNames(matched, half);
+    for (const auto& [name, ignored] : entry.values(half)) {
+      if (contains(names, name)) continue;
+      throw Refusal(ExitCode::kCannotRead, "the " + profile.kind + " '" + profile.file.string() + "' sets '" + name +
+                                               "', which no " + std::string(nameOf(half)) + " of '" + entry.name +
+                                               "' takes" + didYouMean(name, names));
+    }
+  }
+}
+
+// What of the catalogue an entry of diagnostics, or one of experiments, fits.
+std::vector<DescribedDiagnostic> matchesOf(const ProfileEntry& entry, const std::vector<DescribedDiagnostic>& catalogue,
+                                           bool ofExperiments) {
+  std::vector<DescribedDiagnostic> matched;
+  for (const DescribedDiagnostic& one : catalogue) {
+    const bool fits = matchesName(entry.name, one.diagnostic.name);
+    if (fits && one.diagnostic.experimentOnly == ofExperiments) matched.push_back(one);
+  }
+  return matched;
+}
+
+// True when each parameter that the entry sets is declared by one of the diagnostics.
+bool declareAll(const std::vector<DescribedDiagnostic>& diagnostics, const ProfileEntry& entry) {
+  for (const Half half : kHalves) {
+    const std::vector<std::string> names = declaredNames(diagnostics, half);
+    for (const auto& [name, ignored] : entry.values(half)) {
+      if (!contains(names, name)) return false;
+    }
+  }
+  return true;
+}
+
+// Adds those of the matches that are in doubt.
+void addDoubts(const ProfileEntry& entry, const std::vector<DescribedDiagnostic>& matched,
+               std::vector<Diagnostic>& doubts) {
+  std::vector<DescribedDiagnostic> asked;
+  std::copy_if(matched.begin(), matched.end(), std::back_inserter(asked),
+               [](const DescribedDiagnostic& one) { return one.description.isAsked; });
+  const auto couldNot = [](const DescribedDiagnostic& one) { return one.description.error != nullptr; };
+  // Without one that is asked, the entry does not matter; with one whose parameters are not known, it is passed over.
+  if (asked.empty() || std::any_of(asked.begin(), asked.end(), couldNot) || declareAll(asked, entry)) return;
+  for (const DescribedDiagnostic& one : matched) {
+    if (!one.description.isAsked && !contains(doubts, one.diagnostic)) doubts.push_back(one.diagnostic);
+  }
+}
+
+// Checks the entries of diagnostics or those of experiments.
+void checkEntries(const Profile& profile, const std::vector<ProfileEntry>& entries,
+                  const std::vector<DescribedDiagnostic>& catalogue, bool ofExperiments) {
+  for (const ProfileEntry& entry : entries) {
+    const std::vector<DescribedDiagnostic> matched = matchesOf(entry, catalogue, ofExperiments);
+    if (!matched.empty()) {
+      checkEntry(profile, entry, matched);
+    } else if (!profile.mayNameOthers) {
+      const std::string noun = ofExperiments ? "experiment" : "diagnostic";
+      std::vector<std::string> names;
+      for (const DescribedDiagnostic& one : catalogue) {
+        if (one.diagnostic.experimentOnly == ofExperiments) names.push_back(one.diagnostic.name);
+      }
+      throw Refusal(ExitCode::kCannotRead, "the profile '" + profile.file.string() + "' has an entry '" + entry.name +
+                                               "', which fits no " + noun + didYouMean(entry.name, names));
+    }
+  }
+}
+
+const Value* findIn(const Profile& profile, const Diagnostic& diagnostic, Half half, std::string_view parameter) {
+  return diagnostic.experimentOnly ? profile.findForExperiment(diagnostic.name, diagnostic.usedBy, parameter)
+                                   : profile.find(diagnostic.name, half, parameter);
+}
+
+std::vector<BoundParameter> bindHalf(const DescribedDiagnostic& diagnostic, Half half,
+                                     const std::vector<Profile>& profiles, const std::vector<Setting>& settings) {
+  std::vector<BoundParameter> bound;
+  for (const auto& [name, declaration] : declared(diagnostic, half)) {
+    BoundParameter parameter{name, declaration, std::nullopt, {}};
+    for (const Profile& profile : profiles) {
+      const Value* const value = findIn(profile, diagnostic.diagnostic, half, name);
+      if (value == nullptr) continue;
+      parameter.value = *value;
+      parameter.source = profile.kind + " " + profile.file.filename().string();
+    }
+    for (const SettingPlace place : {SettingPlace::kEnvironment, SettingPlace::kCommandLine}) {
+      for (const Setting& setting : settings) {
+        if (setting.place != place || !sets(setting, half, name)) continue;
+        parameter.value = setting.value;
+        parameter.source = sourceOf(place);
+      }
+    }
+    bound.push_back(std::move(parameter));
+  }
+  return bound;
+}
+
+}  // namespace
+
+Setting parseSetting(const std::string& text, SettingPlace place) {
+  const std::string what = quoted(place, text) + ": ";
+  const std::size_t equals = text.find('=');
+  if (equals == std::string::npos) {
+    throw Refusal(ExitCode::kUsage, what + "it must have the form [experiment.|analysis.]NAME=VALUE");
+  }
+  Setting setting{text, std::nullopt, text.substr(0, equals), 0, place};
+  for (const Half half : kHalves) {
+    const std::string prefix = std::string(nameOf(half)) + ".";
+    if (setting.half || !setting.name.starts_with(prefix)) continue;
+    setting.half = half;
+    setting.name.erase(0, prefix.size());
+  }
+  if (setting.name.empty()) throw Refusal(ExitCode::kUsage, what + "the parameter's name is missing");
+  std::string problem;
+  const std::optional<Value> value = parseNumber(std::string_view(text).substr(equals + 1), &problem);
+  if (!value) throw Refusal(ExitCode::kUsage, what + problem);
+  setting.value = *value;
+  return setting;
+}
+
+std::vector<Setting> settingsOfEnvironment() {
+  std::vector<Setting> settings;
+  const char* const variable = std::getenv(kSettingsVariable);
+  std::istringstream texts(variable == nullptr ? "" : variable);
+  for (std::string text; texts >> text;) settings.push_back(parseSetting(text, SettingPlace::kEnvironment));
+  return settings;
+}
+
+Dictionary dictionaryOf(const std::vector<BoundParameter>& parameters) {
+  Dictionary dictionary;
+  for (const BoundParameter& parameter : parameters) {
+    if (parameter.value) dictionary.set(parameter.name, *parameter.value);
+  }
+  return dictionary;
+}
+
+void checkProfile(const Profile& profile, const std::vector<DescribedDiagnostic>& catalogue) {
+  checkEntries(profile, profile.entries, catalogue, false);
+  checkEntries(profile, profile.experiments, catalogue, true);
+}
+
+std::vector<Diagnostic> inDoubt(const Profile& profile, const std::vector<DescribedDiagnostic>& catalogue) {
+  std::vector<Diagnostic> doubts;
+  for (const ProfileEntry& entry : profile.entries) addDoubts(entry, matchesOf(entry, catalogue, false), doubts);
+  for (const ProfileEntry& entry : profile.experiments) addDoubts(entry, matchesOf(entry, catalogue, true), doubts);
+  return doubts;
+}
+
+void checkSettings(const std::vector<Setting>& settings, const std::vector<DescribedDiagnostic>& selected) {
+  for (std::size_t i = 0; i < settings.size(); ++i) {
+    const Setting& setting = settings[i];
+    const std::vector<std::string> names = declaredNames(selected, setting.half);
+    if (!contains(names, setting.name)) {
+      const std::string noun = nounOf(selected);
+      const std::string where =
+          setting.half ? "no " + std::string(nameOf(*setting.half)) + " of the " + noun : "none of the " + noun;
+      throw Refusal(ExitCode::kUsage, quoted(setting.place, setting.text) + ": " + where + " takes a parameter '" +
+                                          setting.name + "'" + didYouMean(setting.name, names) +
+                                          noteOfUndescribed(selected));
+    }
+    for (std::size_t j = 0; j < i; ++j) {
+      const Setting& other = settings[j];
+      const bool overlap = other.place == setting.place && other.name == setting.name &&
+                           (!other.half || !setting.half || *other.half == *setting.half);
+      if (!overlap) continue;
+      throw Refusal(ExitCode::kUsage, quoted(other.place, other.text) + " and " + quoted(setting.place, setting.text) +
+                                          " set the same parameter twice");
+    }
+  }
+}
+
+BoundParameters bindParameters(const DescribedDiagnostic& diagnostic, const std::vector<Profile>& profiles,
+                               const std::vector<Setting>& settings) {
+  return {bindHalf(diagnostic, Half::kExperiment, profiles, settings),
+          bindHalf(diagnostic, Half::kAnalysis, profiles, settings)};
+}
+
+void requireParameters(const DescribedDiagnostic& diagnostic, const BoundParameters& parameters) {
+  for (const Half half : kHalves) {
+    for (const BoundParameter& one : parameters.of(half)) {
+      if (one.value || !one.declaration.required()) continue;
+      const std::string name =
+          diagnostic.diagnostic.experimentOnly ? one.name : formatMessage("%@.%@", nameOf(half), one.name);
+      throw Refusal(ExitCode::kUsage,
+                    formatMessage("%@ needs the parameter %@; give it with --set %@=VALUE or in a profile",
+                                  diagnostic.diagnostic.name, name, name));
+    }
+  }
+}
+
+}  // namespace quazor

@@ -1,0 +1,386 @@
+#include "host/plugin/parameters.h"
+
+#include "host/error/exit_code.h"
+#include "host/error/host_error.h"
+
+#include <gmock/gmock.h>
+#include <gtest/gtest.h>
+
+#include <cstdlib>
+#include <functional>
+
+namespace quazor {
+namespace {
+
+using testing::HasSubstr;
+
+QZDescription descriptionWith(const std::vector<std::pair<std::string, bool>>& parameters) {
+  QZDescription description("Summary.");
+  for (const auto& [name, required] : parameters) {
+    description.addParameter(QZNumberParameter("About it.", required), name);
+  }
+  return description;
+}
+
+DescribedDiagnostic diagnosticWith(const std::string& name, const std::vector<std::pair<std::string, bool>>& experiment,
+                                   const std::vector<std::pair<std::string, bool>>& analysis) {
+  DescribedDiagnostic described;
+  described.diagnostic.name = name;
+  described.description.experiment = descriptionWith(experiment);
+  described.description.analysis = descriptionWith(analysis);
+  return described;
+}
+
+DescribedDiagnostic fault() {
+  return diagnosticWith("Fault", {{"frameCount", true}, {"timeout", true}}, {{"frameCount", true}});
+}
+DescribedDiagnostic sync() { return diagnosticWith("Sync.Back", {{"duration", true}}, {}); }
+DescribedDiagnostic relaxed() { return diagnosticWith("Relaxed", {{"gain", false}}, {}); }
+
+DescribedDiagnostic undescribed() {
+  DescribedDiagnostic described = diagnosticWith("Broken", {}, {});
+  described.description.error = hostError(HostErrorCode::kException, "it threw");
+  return described;
+}
+
+DescribedDiagnostic imagesAlone() {
+  DescribedDiagnostic described = diagnosticWith("Images", {{"images", true}, {"timeout", true}}, {});
+  described.diagnostic.experimentOnly = true;
+  described.diagnostic.usedBy = {"Fault", "Sync.Back"};
+  return described;
+}
+
+Profile profileWith(const std::string& diagnostics) {
+  return parseProfile("dir/some.json", R"({"schema": 1, "diagnostics": )" + diagnostics + "}");
+}
+
+std::vector<Setting> settings(const std::vector<std::string>& texts) {
+  std::vector<Setting> parsed;
+  for (const std::string& text : texts) parsed.push_back(parseSetting(text));
+  return parsed;
+}
+
+std::string refusalOf(ExitCode code, const std::function<void()>& action) {
+  try {
+    action();
+  } catch (const Refusal& refusal) {
+    EXPECT_EQ(refusal.code(), code);
+    return refusal.what();
+  }
+  return "accepted";
+}
+
+TEST(ParseSetting, TakesThePrefixAsTheHalf) {
+  struct Row {
+    const char* text;
+    std::optional<Half> half;
+    const char* name;
+    Value value;
+  };
+  const Row rows[] = {
+      {"duration=3", std::nullopt, "duration", 3},
+      {"experiment.duration=2.5", Half::kExperiment, "duration", 2.5},
+      {"analysis.frameCount=-1", Half::kAnalysis, "frameCount", -1},
+      {"experiment.analysis.x=1", Half::kExperiment, "analysis.x", 1},
+      {"a.b=1", std::nullopt, "a.b", 1},
+      {"experimental=1", std::nullopt, "experimental", 1},
+  };
+  for (const Row& row : rows) {
+    const Setting setting = parseSetting(row.text);
+    EXPECT_EQ(setting.half, row.half) << row.text;
+    EXPECT_EQ(setting.name, row.name) << row.text;
+    EXPECT_EQ(setting.value, row.value) << row.text;
+    EXPECT_EQ(setting.text, row.text);
+  }
+}
+
+TEST(ParseSetting, RefusesOtherForms) {
+  struct Row {
+    const char* text;
+    const char* problem;
+  };
+  constexpr Row kRows[] = {
+      {"", "it must have the form"},
+      {"duration", "it must have the form"},
+      {"=3", "the parameter's name is missing"},
+      {"analysis.=3", "the parameter's name is missing"},
+      {"duration=", "a number is missing"},
+      {"duration=3s", "'3s' is not a number"},
+      {"duration=3=4", "'3=4' is not a number"},
+      {"duration=nan", "'nan' is not a finite number"},
+      {"duration=1e999", "'1e999' is outside the range of numbers"},
+  };
+  for (const Row& row : kRows) {
+    EXPECT_THAT(refusalOf(ExitCode::kUsage, [&] { parseSetting(row.text); }), HasSubstr(row.problem)) << row.text;
+  }
+}
+
+TEST(CheckSettings, RefusesWhatNoneOfTheDiagnosticsTakes) {
+  const auto check = [](const std::vector<std::string>& texts, const std::vector<DescribedDiagnostic>& selected) {
+    return refusalOf(ExitCode::kUsage, [&] { checkSettings(settings(texts), selected); });
+  };
+  EXPECT_EQ(check({"duratoin=3"}, {sync()}),
+            "--set 'duratoin=3': none of the diagnostics takes a parameter 'duratoin'; "
+            "did you mean 'duration'?");
+  EXPECT_EQ(check({"analysis.duration=3"}, {sync()}),
+            "--set 'analysis.duration=3': no analysis of the diagnostics takes a parameter 'duration'");
+  EXPECT_EQ(check({"duration=3", "timeout=3"}, {sync(), fault()}), "accepted");
+  EXPECT_THAT(check({"duration=3"}, {fault()}), HasSubstr("takes a parameter 'duration'"));
+}
+
+TEST(CheckSettings, SpeaksOfWhatIsSelected) {
+  const auto check = [](const std::string& text, const std::vector<DescribedDiagnostic>& selected) {
+    return refusalOf(ExitCode::kUsage, [&] { checkSettings(settings({text}), selected); });
+  };
+  EXPECT_EQ(check("x=3", {imagesAlone()}), "--set 'x=3': none of the experiments takes a parameter 'x'");
+  EXPECT_EQ(check("analysis.images=3", {imagesAlone()}),
+            "--set 'analysis.images=3': no analysis of the experiments takes a parameter 'images'");
+  EXPECT_EQ(check("x=3", {imagesAlone(), fault()}),
+            "--set 'x=3': none of the diagnostics and experiments takes a parameter 'x'");
+  EXPECT_EQ(check("experiment.images=3", {imagesAlone()}), "accepted");
+}
+
+TEST(CheckProfile, ChecksTheEntriesOfExperimentsAgainstExperiments) {
+  const auto check = [](const std::string& experiments, bool allMustExist) {
+    Profile profile =
+        parseProfile("some.json", R"({"schema": 1, "diagnostics": {}, "experiments": )" + experiments + "}");
+    profile.mayNameOthers = !allMustExist;
+    return refusalOf(ExitCode::kCannotRead, [&] { checkProfile(profile, {sync(), imagesAlone()}); });
+  };
+  EXPECT_EQ(check(R"({"Im*": {"images": 5}})", true), "accepted");
+  EXPECT_EQ(check(R"({"Images": {"image": 5}})", false),
+            "the profile 'some.json' sets 'image', which no experiment of 'Images' takes; did you mean 'images'?");
+  EXPECT_EQ(check(R"({"Image": {"images": 5}})", true),
+            "the profile 'some.json' has an entry 'Image', which fits no experiment; did you mean 'Images'?");
+  EXPECT_EQ(check(R"({"Sync.Back": {"duration": 5}})", true),
+            "the profile 'some.json' has an entry 'Sync.Back', which fits no experiment");
+  EXPECT_EQ(check(R"({"Sync.Back": {"duration": 5}})", false), "accepted");
+}
+
+TEST(CheckSettings, SaysWhenADiagnosticsParametersAreNotKnown) {
+  EXPECT_THAT(refusalOf(ExitCode::kUsage, [] { checkSettings(settings({"x=3"}), {undescribed()}); }),
+              HasSubstr("(Broken could not be described: it threw)"));
+}
+
+TEST(CheckSettings, RefusesTwoSettingsOfOneParameter) {
+  const auto check = [](const std::vector<std::string>& texts) {
+    return refusalOf(ExitCode::kUsage, [&] { checkSettings(settings(texts), {fault()}); });
+  };
+  EXPECT_EQ(check({"timeout=3", "timeout=4"}), "--set 'timeout=3' and --set 'timeout=4' set the same parameter twice");
+  EXPECT_THAT(check({"frameCount=3", "analysis.frameCount=4"}), HasSubstr("twice"));
+  EXPECT_THAT(check({"experiment.frameCount=3", "experiment.frameCount=3"}), HasSubstr("twice"));
+  EXPECT_EQ(check({"experiment.frameCount=3", "analysis.frameCount=4", "timeout=5"}), "accepted");
+}
+
+TEST(CheckProfile, RefusesAParameterThatNoDiagnosticOfTheEntryTakes) {
+  const auto check = [](const std::string& diagnostics) {
+    return refusalOf(ExitCode::kCannotRead, [&] {
+      checkProfile(profileWith(diagnostics), {sync(), fault(), undescribed()});
+    });
+  };
+  EXPECT_EQ(
+      check(R"({"Sync.*": {"experiment": {"duraton": 3}}})"),
+      "the profile 'dir/some.json' sets 'duraton', which no experiment of 'Sync.*' takes; did you mean 'duration'?");
+  EXPECT_THAT(check(R"({"Sync.*": {"analysis": {"duration": 3}}})"), HasSubstr("no analysis of 'Sync.*' takes"));
+  EXPECT_EQ(check(R"({"[SF]*": {"experiment": {"duration": 3, "timeout": 4}}})"), "accepted");
+  EXPECT_EQ(check(R"({"B*": {"experiment": {"anything": 3}}})"), "accepted");
+}
+
+TEST(CheckProfile, PassesOverAnEntryForSomethingThatWasNotDescribed) {
+  DescribedDiagnostic other = diagnosticWith("Sync.Front", {}, {});
+  other.description.isAsked = false;
+  const auto check = [&other](const std::string& diagnostics) {
+    return refusalOf(ExitCode::kCannotRead, [&] { checkProfile(profileWith(diagnostics), {sync(), other}); });
+  };
+  EXPECT_EQ(check(R"({"Sync.*": {"experiment": {"gain": 3}}})"), "accepted");
+  EXPECT_EQ(check(R"({"Sync.Front": {"experiment": {"gain": 3}}})"), "accepted");
+  EXPECT_THAT(check(R"({"Sync.Back": {"experiment": {"gain": 3}}})"), HasSubstr("sets 'gain'"));
+}
+
+TEST(InDoubt, IsWhatMightDeclareAParameterThatNothingDescribedDeclares) {
+  DescribedDiagnostic other = diagnosticWith("Sync.Front", {}, {});
+  other.description.isAsked = false;
+  DescribedDiagnostic alone = imagesAlone();
+  DescribedDiagnostic otherAlone = imagesAlone();
+  otherAlone.diagnostic.name = "Images.More";
+  otherAlone.description = {};
+  otherAlone.description.isAsked = false;
+  const std::vector<DescribedDiagnostic> catalogue = {sync(), other, undescribed(), alone, otherAlone};
+  struct Row {
+    const char* name;
+    const char* diagnostics;
+    const char* experiments;
+    std::vector<std::string> doubts;
+  };
+  const Row rows[] = {
+      {"a parameter that is declared", R"({"Sync.*": {"experiment": {"duration": 3}}})", "{}", {}},
+      {"one that is not", R"({"Sync.*": {"experiment": {"gain": 3}}})", "{}", {"Sync.Front"}},
+      {"one of the other half", R"({"Sync.*": {"analysis": {"duration": 3}}})", "{}", {"Sync.Front"}},
+      {"two such entries",
+       R"({"Sync.*": {"experiment": {"gain": 3}}, "S*": {"experiment": {"gain": 3}}})",
+       "{}",
+       {"Sync.Front"}},
+      {"an entry for nothing that is asked", R"({"Sync.Front": {"experiment": {"gain": 3}}})", "{}", {}},
+      {"an entry for all, of which one cannot be described", R"({"*": {"experiment": {"gain": 3}}})", "{}", {}},
+      {"an experiment's parameter", "{}", R"({"Images*": {"gain": 3}})", {"Images.More"}},
+      {"an experiment's parameter that is declared", "{}", R"({"Images*": {"images": 3}})", {}},
+  };
+  for (const Row& row : rows) {
+    const Profile profile =
+        parseProfile("some.json", std::string(R"({"schema": 1, "diagnostics": )") + row.diagnostics +
+                                      R"(, "experiments": )" + row.experiments + "}");
+    EXPECT_EQ(namesOf(inDoubt(profile, catalogue)), row.doubts) << row.name;
+  }
+}
+
+TEST(CheckProfile, RefusesAnEntryThatFitsNoDiagnosticOnlyWhenAllMustExist) {
+  Profile profile = profileWith(R"({"Sync.Bakc": {"experiment": {"duration": 3}}})");
+  EXPECT_EQ(
+      refusalOf(ExitCode::kCannotRead, [&] { checkProfile(profile, {sync()}); }),
+      "the profile 'dir/some.json' has an entry 'Sync.Bakc', which fits no diagnostic; did you mean 'Sync.Back'?");
+  profile.mayNameOthers = true;
+  EXPECT_EQ(refusalOf(ExitCode::kCannotRead, [&] { checkProfile(profile, {sync()}); }), "accepted");
+}
+
+TEST(BindParameters, LetsASettingWinOverTheProfile) {
+  const Profile profile = profileWith(R"({"Fault": {"experiment": {"frameCount": 90, "timeout": 10}}})");
+  const BoundParameters bound = bindParameters(fault(), {profile}, settings({"experiment.frameCount=5"}));
+  ASSERT_EQ(bound.experiment.size(), 2U);
+  EXPECT_EQ(bound.experiment[0].name, "frameCount");
+  EXPECT_EQ(bound.experiment[0].value, Value(5));
+  EXPECT_EQ(bound.experiment[0].source, "command line");
+  EXPECT_EQ(bound.experiment[1].value, Value(10));
+  EXPECT_EQ(bound.experiment[1].source, "profile some.json");
+  ASSERT_EQ(bound.analysis.size(), 1U);
+  EXPECT_EQ(bound.analysis[0].value, std::nullopt);
+  EXPECT_EQ(bound.analysis[0].source, "");
+}
+
+TEST(BindParameters, TakesTheValueOfTheLastPlaceThatHasOne) {
+  const std::vector<Profile> profiles = {
+      parseProfile("default.json", R"({"schema": 1, "diagnostics": {"Fault": {"experiment":
+        {"frameCount": 1, "timeout": 1}, "analysis": {"frameCount": 1}}}})"),
+      parseProfile("mine.json", R"({"schema": 1, "diagnostics": {"*": {"experiment": {"frameCount": 2}}}})"),
+      parseProfile("yours.json", R"({"schema": 1, "diagnostics": {"Fault": {"experiment": {"frameCount": 3}}}})")};
+  const Setting environment = parseSetting("experiment.frameCount=4", SettingPlace::kEnvironment);
+  const Setting commandLine = parseSetting("experiment.frameCount=5");
+  struct Row {
+    std::vector<Profile> profiles;
+    std::vector<Setting> settings;
+    std::optional<Value> value;
+    const char* source;
+  };
+  const Row rows[] = {
+      {{}, {}, std::nullopt, ""},
+      {{profiles[0]}, {}, 1, "profile default.json"},
+      {{profiles[0], profiles[1]}, {}, 2, "profile mine.json"},
+      {{profiles[0], profiles[1], profiles[2]}, {}, 3, "profile yours.json"},
+      {{profiles[2], profiles[1]}, {}, 2, "profile mine.json"},
+      {profiles, {environment}, 4, "environment"},
+      {profiles, {environment, commandLine}, 5, "command line"},
+      {profiles, {commandLine, environment}, 5, "command line"},
+      {{}, {environment}, 4, "environment"},
+      {profiles, {commandLine}, 5, "command line"},
+  };
+  for (const Row& row : rows) {
+    const BoundParameters bound = bindParameters(fault(), row.profiles, row.settings);
+    EXPECT_EQ(bound.experiment[0].value, row.value) << row.source;
+    EXPECT_EQ(bound.experiment[0].source, row.source);
+  }
+  // What the later places do not hold is the earlier ones'.
+  const BoundParameters bound = bindParameters(fault(), profiles, {environment, commandLine});
+  EXPECT_EQ(bound.experiment[1].value, Value(1));
+  EXPECT_EQ(bound.experiment[1].source, "profile default.json");
+  EXPECT_EQ(bound.analysis[0].value, Value(1));
+}
+
+class SettingsOfEnvironment : public testing::Test {
+ protected:
+  ~SettingsOfEnvironment() override { ::unsetenv(kSettingsVariable); }
+
+  static void set(const char* text) { ASSERT_EQ(::setenv(kSettingsVariable, text, 1), 0); }
+};
+
+TEST_F(SettingsOfEnvironment, AreSeparatedByWhiteSpace) {
+  ::unsetenv(kSettingsVariable);
+  EXPECT_TRUE(settingsOfEnvironment().empty());
+  set(" \t ");
+  EXPECT_TRUE(settingsOfEnvironment().empty());
+  set("duration=3  analysis.frameCount=4\ttimeout=5\n");
+  const std::vector<Setting> settings = settingsOfEnvironment();
+  ASSERT_EQ(settings.size(), 3U);
+  EXPECT_EQ(settings[0].name, "duration");
+  EXPECT_EQ(settings[1].half, Half::kAnalysis);
+  EXPECT_EQ(settings[2].value, Value(5));
+  for (const Setting& setting : settings) EXPECT_EQ(setting.place, SettingPlace::kEnvironment);
+}
+
+TEST_F(SettingsOfEnvironment, AreCalledByTheirVariable) {
+  set("duration");
+  EXPECT_THAT(refusalOf(ExitCode::kUsage, [] { settingsOfEnvironment(); }),
+              HasSubstr("QUAZOR_SET 'duration': it must have the form"));
+  set("duratoin=3");
+  EXPECT_EQ(refusalOf(ExitCode::kUsage, [] { checkSettings(settingsOfEnvironment(), {sync()}); }),
+            "QUAZOR_SET 'duratoin=3': none of the diagnostics takes a parameter 'duratoin'; did you mean 'duration'?");
+  set("duration=3 duration=4");
+  EXPECT_EQ(refusalOf(ExitCode::kUsage, [] { checkSettings(settingsOfEnvironment(), {sync()}); }),
+            "QUAZOR_SET 'duration=3' and QUAZOR_SET 'duration=4' set the same parameter twice");
+}
+
+TEST_F(SettingsOfEnvironment, MaySetWhatTheCommandLineSetsToo) {
+  set("duration=3");
+  std::vector<Setting> both = settingsOfEnvironment();
+  both.push_back(parseSetting("duration=4"));
+  EXPECT_EQ(refusalOf(ExitCode::kUsage, [&] { checkSettings(both, {sync()}); }), "accepted");
+}
+
+TEST(BindParameters, SetsAParameterWithoutPrefixWhereverItIsDeclared) {
+  const BoundParameters bound = bindParameters(fault(), {}, settings({"frameCount=7"}));
+  EXPECT_EQ(bound.experiment[0].value, Value(7));
+  EXPECT_EQ(bound.analysis[0].value, Value(7));
+  EXPECT_EQ(bound.experiment[1].value, std::nullopt);
+}
+
+TEST(BindParameters, SetsAParameterWithAPrefixOnlyThere) {
+  const BoundParameters bound = bindParameters(fault(), {}, settings({"analysis.frameCount=7"}));
+  EXPECT_EQ(bound.experiment[0].value, std::nullopt);
+  EXPECT_EQ(bound.analysis[0].value, Value(7));
+}
+
+TEST(BindParameters, GivesAnExperimentItsOwnValuesAndElseThoseOfItsDiagnostics) {
+  const Profile profile = parseProfile("some.json", R"({"schema": 1,
+    "diagnostics": {"Sync.*": {"experiment": {"images": 1, "timeout": 2}}, "Fault": {"experiment": {"timeout": 3}}},
+    "experiments": {"Images": {"images": 4}}})");
+  BoundParameters bound = bindParameters(imagesAlone(), {profile}, {});
+  ASSERT_EQ(bound.experiment.size(), 2U);
+  EXPECT_EQ(bound.experiment[0].value, Value(4));
+  EXPECT_EQ(bound.experiment[0].source, "profile some.json");
+  EXPECT_EQ(bound.experiment[1].value, Value(3));
+  EXPECT_TRUE(bound.analysis.empty());
+  bound = bindParameters(imagesAlone(), {profile}, settings({"experiment.images=9"}));
+  EXPECT_EQ(bound.experiment[0].value, Value(9));
+}
+
+TEST(RequireParameters, RefusesARequiredParameterWithoutAValue) {
+  const auto require = [](const DescribedDiagnostic& diagnostic, const std::vector<std::string>& texts) {
+    return refusalOf(ExitCode::kUsage,
+                     [&] { requireParameters(diagnostic, bindParameters(diagnostic, {}, settings(texts))); });
+  };
+  EXPECT_EQ(require(sync(), {}),
+            "Sync.Back needs the parameter experiment.duration; give it with "
+            "--set experiment.duration=VALUE or in a profile");
+  EXPECT_EQ(require(imagesAlone(), {"timeout=1"}),
+            "Images needs the parameter images; give it with --set images=VALUE or in a profile");
+  EXPECT_THAT(require(fault(), {"experiment.frameCount=1", "timeout=1"}), HasSubstr("analysis.frameCount"));
+  EXPECT_EQ(require(fault(), {"frameCount=1", "timeout=1"}), "accepted");
+  EXPECT_EQ(require(relaxed(), {}), "accepted");
+}
+
+TEST(DictionaryOf, HoldsOnlyWhatIsSet) {
+  const BoundParameters bound = bindParameters(fault(), {}, settings({"timeout=2"}));
+  EXPECT_EQ(dictionaryOf(bound.experiment), (Dictionary{{"timeout", 2}}));
+  EXPECT_TRUE(dictionaryOf(bound.analysis).empty());
+}
+
+}  // namespace
+}  // namespace quazor

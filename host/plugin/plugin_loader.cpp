@@ -1,0 +1,126 @@
+#include "host/plugin/plugin_loader.h"
+
+#include "base/text/nearest_name.h"
+#include "contract/contract.h"
+#include "host/error/exit_code.h"
+#include "host/plugin/shared_object.h"
+
+#include <dlfcn.h>
+
+#include <algorithm>
+#include <charconv>
+#include <cstddef>
+#include <string>
+#include <system_error>
+
+namespace quazor {
+
+namespace {
+
+[[noreturn]] void refusePlugin(const std::filesystem::path& file, const std::string& what) {
+  throw Refusal(ExitCode::kCannotRead, "the plug-in '" + file.string() + "' " + what);
+}
+
+[[noreturn]] void refuseUnlinkable(const std::filesystem::path& file, const std::string& message) {
+  const std::optional<int> version = contractVersionIn(message);
+  if (!version || *version == QUAZOR_CONTRACT_VERSION) refusePlugin(file, "cannot be loaded: " + message);
+  refusePlugin(file, "was built against version " + std::to_string(*version) +
+                         " of the plug-in contract, and this program has version " +
+                         std::to_string(QUAZOR_CONTRACT_VERSION) + "; rebuild the plug-in against this version");
+}
+
+void loadPlugin(const std::filesystem::path& file) {
+  if (const std::string problem = problemOfSharedObject(file); !problem.empty()) refusePlugin(file, problem);
+  const QZLab& lab = QZLab::defaultLab();
+  const std::size_t registered = lab.registrations().size();
+  const std::size_t refused = lab.refusedNames().size();
+  // The absolute path has a slash, so that the linker opens this file and searches nowhere else.
+  if (dlopen(std::filesystem::absolute(file).c_str(), RTLD_NOW | RTLD_LOCAL) == nullptr) {
+    const char* message = dlerror();
+    refuseUnlinkable(file, message == nullptr ? "the dynamic linker does not say why" : message);
+  }
+  if (lab.refusedNames().size() > refused) {
+    refusePlugin(file, "registers the name '" + lab.refusedNames()[refused] + "', which is already taken");
+  }
+  if (lab.registrations().size() == registered) refusePlugin(file, "registers nothing");
+}
+
+bool isSameFile(const std::filesystem::path& a, const std::filesystem::path& b) {
+  std::error_code ignored;
+  return std::filesystem::equivalent(a, b, ignored);
+}
+
+std::vector<std::string> namesOf(const QZLab& lab, QZLab::Kind kind) {
+  std::vector<std::string> names;
+  for (const QZLab::Registration& registration : lab.registrations()) {
+    if (registration.kind == kind) names.push_back(registration.name);
+  }
+  return names;
+}
+
+void checkPart(const LoadedPlugin& plugin, const std::string& diagnostic, QZLab::Kind kind, const std::string& name) {
+  const QZLab& lab = QZLab::defaultLab();
+  if (lab.find(kind, name) != nullptr) return;
+  const std::string part = kind == QZLab::Kind::kExperiment ? "experiment" : "analysis";
+  refusePlugin(plugin.file, "registers the diagnostic '" + diagnostic + "' with the " + part + " '" + name +
+                                "', which nobody has registered" + didYouMean(name, namesOf(lab, kind)));
+}
+
+void checkDiagnostics(const std::vector<LoadedPlugin>& plugins) {
+  const std::vector<QZLab::Registration>& registrations = QZLab::defaultLab().registrations();
+  std::size_t at = 0;
+  for (const LoadedPlugin& plugin : plugins) {
+    for (; at < plugin.last; ++at) {
+      const QZLab::Registration& one = registrations[at];
+      if (one.kind != QZLab::Kind::kDiagnostic) continue;
+      checkPart(plugin, one.name, QZLab::Kind::kExperiment, one.experimentName);
+      checkPart(plugin, one.name, QZLab::Kind::kAnalysis, one.analysisName);
+    }
+  }
+}
+
+std::vector<LoadedPlugin> loadEach(const std::vector<std::filesystem::path>& files,
+                                   const std::function<void(const std::filesystem::path& file)>& isNext) {
+  std::vector<LoadedPlugin> loaded;
+  for (const std::filesystem::path& file : files) {
+    const bool again = std::any_of(loaded.begin(), loaded.end(),
+                                   [&file](const LoadedPlugin& other) { return isSameFile(other.file, file); });
+    if (again) continue;
+    if (isNext) isNext(file);
+    loadPlugin(file);
+    loaded.push_back({file, QZLab::defaultLab().registrations().size()});
+  }
+  return loaded;
+}
+
+}  // namespace
+
+std::vector<LoadedPlugin> loadPlugins(const std::vector<std::filesystem::path>& files,
+                                      const std::function<void(const std::filesystem::path& file)>& isNext) {
+  std::vector<LoadedPlugin> loaded = loadEach(files, isNext);
+  checkDiagnostics(loaded);
+  return loaded;
+}
+
+void loadSomePlugins(const std::vector<std::filesystem::path>& files) { loadEach(files, nullptr); }
+
+std::optional<int> contractVersionIn(std::string_view linkerMessage) {
+  // The mangled name of the contract's namespace: 6quazor, the next name's length, contract_, the version.
+  constexpr std::string_view kNamespace = "6quazor";
+  constexpr std::string_view kContract = "contract_";
+  const std::size_t found = linkerMessage.find(kNamespace);
+  if (found == std::string_view::npos) return std::nullopt;
+  std::string_view rest = linkerMessage.substr(found + kNamespace.size());
+  std::size_t length = 0;
+  const auto [lengthEnd, lengthError] = std::from_chars(rest.data(), rest.data() + rest.size(), length);
+  if (lengthError != std::errc()) return std::nullopt;
+  rest.remove_prefix(static_cast<std::size_t>(lengthEnd - rest.data()));
+  rest = rest.substr(0, length);
+  if (!rest.starts_with(kContract)) return std::nullopt;
+  rest.remove_prefix(kContract.size());
+  int version = 0;
+  const auto [end, error] = std::from_chars(rest.data(), rest.data() + rest.size(), version);
+  return error == std::errc() && end == rest.data() + rest.size() ? std::optional(version) : std::nullopt;
+}
+
+}  // namespace quazor

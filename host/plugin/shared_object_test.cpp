@@ -1,0 +1,61 @@
+#include "host/plugin/shared_object.h"
+
+#include "host/testing/test_directory.h"
+
+#include <gtest/gtest.h>
+#include <sys/stat.h>
+
+#include <string>
+
+namespace quazor {
+namespace {
+
+// This test's own program: an ELF file that the dynamic linker has mapped.
+std::string ownProgram() {
+  std::ostringstream content;
+  content << std::ifstream("/proc/self/exe", std::ios::binary).rdbuf();
+  return content.str();
+}
+
+TEST(ProblemOfSharedObject, IsNothingForAWholeFile) { EXPECT_EQ(problemOfSharedObject("/proc/self/exe"), ""); }
+
+TEST(ProblemOfSharedObject, TellsWhatAFileIsInstead) {
+  const TestDirectory directory;
+  EXPECT_EQ(problemOfSharedObject(directory.path() / "nothing.so"), "does not exist");
+  EXPECT_EQ(problemOfSharedObject(directory.path()), "is a directory");
+  EXPECT_EQ(problemOfSharedObject("/dev/null"), "is not a file");
+  EXPECT_EQ(problemOfSharedObject(directory.write("empty.so", "")), "is not a shared object");
+  EXPECT_EQ(problemOfSharedObject(directory.write("short.so",
+                                                  "\x7F"
+                                                  "EL")),
+            "is not a shared object");
+  EXPECT_EQ(problemOfSharedObject(directory.write("text.so", "hello, this is text")), "is not a shared object");
+}
+
+TEST(ProblemOfSharedObject, FindsEveryTruncation) {
+  const TestDirectory directory;
+  const std::string whole = ownProgram();
+  ASSERT_GT(whole.size(), 65536U);
+  for (const std::size_t size : {std::size_t{4}, std::size_t{16}, std::size_t{63}, std::size_t{64}, std::size_t{100},
+                                 std::size_t{4096}, std::size_t{65536}}) {
+    EXPECT_EQ(problemOfSharedObject(directory.write("cut.so", whole.substr(0, size))), "is a truncated shared object")
+        << size;
+  }
+}
+
+TEST(ProblemOfSharedObject, DoesNotBelieveImpossibleOffsets) {
+  const TestDirectory directory;
+  std::string content = ownProgram();
+  for (std::size_t i = 32; i < 40; ++i) content[i] = '\xFF';  // where the program headers are
+  EXPECT_EQ(problemOfSharedObject(directory.write("wild.so", content)), "is a truncated shared object");
+}
+
+TEST(ProblemOfSharedObject, LeavesAnotherMachinesFileToTheLinker) {
+  const TestDirectory directory;
+  std::string content = ownProgram();
+  content[4] = 1;  // 32 bits
+  EXPECT_EQ(problemOfSharedObject(directory.write("small.so", content)), "");
+}
+
+}  // namespace
+}  // namespace quazor

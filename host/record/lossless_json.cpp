@@ -1,0 +1,273 @@
+#include "host/record/lossless_json.h"
+
+#include "host/record/value_json.h"
+
+#include <cmath>
+#include <cstdint>
+#include <limits>
+#include <memory>
+#include <optional>
+#include <utility>
+
+namespace quazor {
+
+using Json = nlohmann::ordered_json;
+
+namespace {
+
+constexpr std::string_view kDigits = "0123456789abcdef";
+// Of values in values: more than anything needs, and few enough for the stack.
+constexpr int kMostLevels = 500;
+
+class DescribedObject final : public Object {
+ public:
+  explicit DescribedObject(std::string description) : description_(std::move(description)) {}
+
+  std::string description() const override { return description_; }
+
+ private:
+  const std::string description_;
+};
+
+template <class Octets>
+std::string hexadecimal(const Octets& octets) {
+  std::string text;
+  text.reserve(2 * octets.size());
+  for (const auto octet : octets) {
+    text += kDigits[static_cast<std::uint8_t>(octet) >> 4];
+    text += kDigits[static_cast<std::uint8_t>(octet) & 0x0F];
+  }
+  return text;
+}
+
+template <class Octets>
+Octets octetsOf(const std::string& text) {
+  Octets octets;
+  if (text.size() % 2 != 0) throw BadRecord("hexadecimal digits are not in pairs");
+  for (std::size_t i = 0; i < text.size(); i += 2) {
+    const std::size_t high = kDigits.find(text[i]);
+    const std::size_t low = kDigits.find(text[i + 1]);
+    if (high == std::string_view::npos || low == std::string_view::npos)
+      throw BadRecord("a hexadecimal digit is wrong");
+    octets.push_back(static_cast<typename Octets::value_type>(high << 4 | low));
+  }
+  return octets;
+}
+
+// True for well-formed UTF-8 (the Unicode Standard, table 3-7).
+bool isUtf8(std::string_view text) {
+  const auto at = [text](std::size_t i) { return i < text.size() ? static_cast<std::uint8_t>(text[i]) : 0; };
+  const auto between = [](int octet, int low, int high) { return octet >= low && octet <= high; };
+  std::size_t i = 0;
+  while (i < text.size()) {
+    const int first = at(i);
+    std::size_t length = 0;
+    int low = 0x80;
+    int high = 0xBF;
+    if (first < 0x80) {
+      ++i;
+      continue;
+    }
+    if (between(first, 0xC2, 0xDF)) length = 2;
+    if (between(first, 0xE0, 0xEF)) length = 3;
+    if (between(first, 0xF0, 0xF4)) length = 4;
+    if (first == 0xE0) low = 0xA0;
+    if (first == 0xED) high = 0x9F;
+    if (first == 0xF0) low = 0x90;
+    if (first == 0xF4) high = 0x8F;
+    if (length == 0 || !between(at(i + 1), low, high)) return false;
+    for (std::size_t next = 2; next < length; ++next) {
+      if (!between(at(i + next), 0x80, 0xBF)) return false;
+    }
+    i += length;
+  }
+  return true;
+}
+
+Json tagged(const char* tag, Json content) { return Json{{tag, std::move(content)}}; }
+
+template <class T>
+T contentAs(const Json& json, const char* what) {
+  try {
+    return json.get<T>();
+  } catch (const Json::exception&) {
+    throw BadRecord(std::string("there is no ") + what + " where one is due");
+  }
+}
+
+std::int64_t signedFrom(const Json& json) {
+  if (!json.is_number_integer()) throw BadRecord("there is no integer where one is due");
+  if (json.is_number_unsigned() &&
+      json.get<std::uint64_t>() > static_cast<std::uint64_t>(std::numeric_limits<std::int64_t>::max())) {
+    throw BadRecord("an integer is too large");
+  }
+  return json.get<std::int64_t>();
+}
+
+std::uint64_t unsignedFrom(const Json& json) {
+  if (!json.is_number_unsigned()) throw BadRecord("there is no unsigned integer where one is due");
+  return json.get<std::uint64_t>();
+}
+
+const Json& arrayIn(const Json& json) {
+  if (!json.is_array()) throw BadRecord("there is no array where one is due");
+  return json;
+}
+
+// `levels` are those that may still be in it.
+Value nestedValueFrom(const Json& json, int levels);
+
+Value arrayFrom(const Json& json, int levels) {
+  Array elements;
+  for (const Json& element : arrayIn(json)) elements.push_back(nestedValueFrom(element, levels));
+  return elements;
+}
+
+Dictionary nestedDictionaryFrom(const Json& json, int levels) {
+  Dictionary dictionary;
+  for (const Json& entry : arrayIn(json)) {
+    if (arrayIn(entry).size() != 2) throw BadRecord("an entry is not a key and a value");
+    dictionary.set(textFrom(entry[0]), nestedValueFrom(entry[1], levels));
+  }
+  return dictionary;
+}
+
+DiagnosticErrorPtr nestedErrorFrom(const Json& json, int levels) {
+  if (json.is_null()) return nullptr;
+  return std::make_shared<const DiagnosticError>(textFrom(memberOf(json, "domain")), signedFrom(memberOf(json, "code")),
+                                                 nestedDictionaryFrom(memberOf(json, "userInfo"), levels));
+}
+
+Value nestedValueFrom(const Json& json, int levels) {
+  if (levels == 0) throw BadRecord("there are too many levels of values in a value");
+  if (!json.is_object() || json.size() != 1) throw BadRecord("a value is not an object with one key");
+  const std::string& kind = json.begin().key();
+  const Json& content = json.begin().value();
+  if (kind == "boolean") return contentAs<bool>(content, "boolean");
+  if (kind == "signed") return signedFrom(content);
+  if (kind == "unsigned") return unsignedFrom(content);
+  if (kind == "double") return numberFrom(content);
+  if (kind == "float") return static_cast<float>(numberFrom(content));
+  if (kind == "string") return textFrom(content);
+  if (kind == "array") return arrayFrom(content, levels - 1);
+  if (kind == "dictionary") return nestedDictionaryFrom(content, levels - 1);
+  if (kind == "date") return Date(Date::duration(signedFrom(content)));
+  if (kind == "bytes") return octetsOf<Bytes>(contentAs<std::string>(content, "string"));
+  if (kind == "error") return nestedErrorFrom(content, levels - 1);
+  if (kind != "object") throw BadRecord("there is no kind of value '" + kind + "'");
+  if (content.is_null()) return std::shared_ptr<Object>();
+  return std::make_shared<DescribedObject>(textFrom(content));
+}
+
+Json boundJson(const QZBound* bound) {
+  if (bound == nullptr) return {};
+  return Json::array({losslessMeasurement(bound->value()), bound->open()});
+}
+
+std::shared_ptr<const QZBound> boundFrom(const Json& json) {
+  if (json.is_null()) return nullptr;
+  if (arrayIn(json).size() != 2) throw BadRecord("a bound is not a measurement and a boolean");
+  return std::make_shared<const QZBound>(measurementFrom(json[0]), contentAs<bool>(json[1], "boolean"));
+}
+
+}  // namespace
+
+const Json& memberOf(const Json& json, const char* key) {
+  if (!json.is_object()) throw BadRecord("there is no object where one is due");
+  const auto found = json.find(key);
+  if (found == json.end()) throw BadRecord(std::string("\"") + key + "\" is missing");
+  return *found;
+}
+
+Json losslessText(std::string_view text) {
+  return isUtf8(text) ? Json(std::string(text)) : tagged("hex", hexadecimal(text));
+}
+
+std::string textFrom(const Json& json) {
+  if (json.is_object()) return octetsOf<std::string>(contentAs<std::string>(memberOf(json, "hex"), "string"));
+  return contentAs<std::string>(json, "string");
+}
+
+Json losslessNumber(double number) { return numberJson(number); }
+
+double numberFrom(const Json& json) {
+  if (json == "nan") return std::numeric_limits<double>::quiet_NaN();
+  if (json == "inf") return std::numeric_limits<double>::infinity();
+  if (json == "-inf") return -std::numeric_limits<double>::infinity();
+  if (!json.is_number()) throw BadRecord("there is no number where one is due");
+  return json.get<double>();
+}
+
+Json losslessValue(const Value& value) {
+  switch (value.kind()) {
+    case Value::Kind::kBoolean: return tagged("boolean", *value.boolean());
+    case Value::Kind::kSigned: return tagged("signed", *value.signedInteger());
+    case Value::Kind::kUnsigned: return tagged("unsigned", *value.unsignedInteger());
+    case Value::Kind::kDouble: return tagged("double", losslessNumber(*value.doubleNumber()));
+    case Value::Kind::kFloat: return tagged("float", losslessNumber(static_cast<double>(*value.floatNumber())));
+    case Value::Kind::kString: return tagged("string", losslessText(*value.string()));
+    case Value::Kind::kDictionary: return tagged("dictionary", losslessDictionary(*value.dictionary()));
+    case Value::Kind::kDate: return tagged("date", value.date()->time_since_epoch().count());
+    case Value::Kind::kBytes: return tagged("bytes", hexadecimal(*value.bytes()));
+    case Value::Kind::kError: return tagged("error", losslessError(value.error()));
+    case Value::Kind::kObject: {
+      const std::shared_ptr<Object> object = value.object();
+      return tagged("object", object == nullptr ? Json() : losslessText(object->description()));
+    }
+    case Value::Kind::kArray: break;
+  }
+  Json elements = Json::array();
+  for (const Value& element : *value.array()) elements.push_back(losslessValue(element));
+  return tagged("array", std::move(elements));
+}
+
+Value valueFrom(const Json& json) { return nestedValueFrom(json, kMostLevels); }
+
+Json losslessDictionary(const Dictionary& dictionary) {
+  Json entries = Json::array();
+  for (const auto& [key, value] : dictionary) entries.push_back(Json::array({losslessText(key), losslessValue(value)}));
+  return entries;
+}
+
+Dictionary dictionaryFrom(const Json& json) { return nestedDictionaryFrom(json, kMostLevels); }
+
+Json losslessError(const DiagnosticErrorPtr& error) {
+  if (error == nullptr) return {};
+  return {{"domain", losslessText(error->domain())},
+          {"code", error->code()},
+          {"userInfo", losslessDictionary(error->userInfo())}};
+}
+
+DiagnosticErrorPtr errorFrom(const Json& json) { return nestedErrorFrom(json, kMostLevels); }
+
+Json losslessMeasurement(const Measurement& measurement) {
+  return Json::array({losslessNumber(measurement.value()), losslessText(measurement.unit().symbol())});
+}
+
+Measurement measurementFrom(const Json& json) {
+  if (arrayIn(json).size() != 2) throw BadRecord("a measurement is not a number and a unit");
+  return {numberFrom(json[0]), QZUnit::unitWithSymbol(textFrom(json[1]))};
+}
+
+Json losslessResult(const QZMeasuredResult& result) {
+  Json json = {{"name", losslessText(result.name())}, {"measurement", losslessMeasurement(result.measurement())}};
+  if (const std::optional<QZLimit>& limit = result.limit()) {
+    json["limit"] = {{"name", losslessText(limit->name())},
+                     {"lower", boundJson(limit->lowerBound().get())},
+                     {"upper", boundJson(limit->upperBound().get())}};
+  }
+  return json;
+}
+
+QZMeasuredResult resultFrom(const Json& json) {
+  QZMeasuredResult result(textFrom(memberOf(json, "name")), measurementFrom(memberOf(json, "measurement")));
+  if (const auto found = json.find("limit"); found != json.end()) {
+    QZLimit limit(textFrom(memberOf(*found, "name")));
+    limit.setLowerBound(boundFrom(memberOf(*found, "lower")));
+    limit.setUpperBound(boundFrom(memberOf(*found, "upper")));
+    result.setLimit(std::move(limit));
+  }
+  return result;
+}
+
+}  // namespace quazor

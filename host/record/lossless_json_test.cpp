@@ -1,0 +1,254 @@
+#include "host/record/lossless_json.h"
+
+#include "host/testing/test_values.h"
+
+#include <gmock/gmock.h>
+#include <gtest/gtest.h>
+
+#include <bit>
+#include <cmath>
+#include <functional>
+#include <limits>
+
+namespace quazor {
+namespace {
+
+using Json = nlohmann::ordered_json;
+using testing::HasSubstr;
+
+// As a record keeps it: as text, in which nothing had to be replaced.
+Json throughText(const Json& json) { return Json::parse(json.dump()); }
+
+Value back(const Value& value) { return valueFrom(throughText(losslessValue(value))); }
+
+std::string problemOf(const std::function<void()>& read) {
+  try {
+    read();
+  } catch (const BadRecord& problem) {
+    return problem.what();
+  }
+  return "accepted";
+}
+
+TEST(LosslessValue, KeepsEveryValue) {
+  RandomValues random(1);
+  constexpr int kValues = 10'000;
+  for (int i = 0; i < kValues; ++i) {
+    const Value value = random.value(4);
+    ASSERT_TRUE(isSame(back(value), value)) << i << ": " << losslessValue(value).dump();
+  }
+}
+
+TEST(LosslessValue, KeepsFloatsOfEveryKind) {
+  // One in 80,021, which is a prime: every sign, every exponent, and mantissas of all kinds.
+  std::uint64_t count = 0;
+  for (std::uint64_t bits = 0; bits <= UINT32_MAX; bits += 80'021) {
+    const Value value(std::bit_cast<float>(static_cast<std::uint32_t>(bits)));
+    ASSERT_TRUE(isSame(back(value), value)) << std::hex << bits;
+    ++count;
+  }
+  EXPECT_GT(count, 50'000U);
+  using Limits = std::numeric_limits<float>;
+  for (const float one : {0.0F, -0.0F, Limits::max(), Limits::lowest(), Limits::min(), Limits::denorm_min(),
+                          Limits::infinity(), -Limits::infinity(), Limits::quiet_NaN(), 0.1F}) {
+    EXPECT_TRUE(isSame(back(one), Value(one))) << one;
+  }
+}
+
+TEST(LosslessValue, KeepsDoublesOfEveryExponent) {
+  RandomValues random(2);
+  for (std::uint64_t exponent = 0; exponent < 2048; ++exponent) {
+    for (int i = 0; i < 10; ++i) {
+      const double number = std::bit_cast<double>((random.bits() & 0x800F'FFFF'FFFF'FFFFU) | exponent << 52);
+      ASSERT_TRUE(isSame(numberFrom(throughText(losslessNumber(number))), number)) << number;
+    }
+  }
+}
+
+TEST(LosslessValue, HasThisForm) {
+  EXPECT_EQ(losslessValue(Array{true, -1, 1U, -0.0, 0.5F, "\u00e4", Dictionary{{"k", Bytes{0x0F, 0xA5}}}}).dump(),
+            R"({"array":[{"boolean":true},{"signed":-1},{"unsigned":1},{"double":-0.0},{"float":0.5},)"
+            "{\"string\":\"\u00e4\"},"
+            R"({"dictionary":[["k",{"bytes":"0fa5"}]]}]})");
+  EXPECT_EQ(losslessValue(std::make_shared<NamedObject>("a stream")).dump(), R"({"object":"a stream"})");
+  EXPECT_EQ(losslessValue(std::shared_ptr<NamedObject>()).dump(), R"({"object":null})");
+  EXPECT_EQ(losslessValue(Date(Date::duration(-5))).dump(), R"({"date":-5})");
+  EXPECT_EQ(losslessValue(errorWithMessage("D", 3, "m", nullptr)).dump(),
+            R"({"error":{"domain":"D","code":3,"userInfo":[["localized-description",{"string":"m"}]]}})");
+  EXPECT_EQ(losslessValue(DiagnosticErrorPtr()).dump(), R"({"error":null})");
+  EXPECT_EQ(losslessNumber(std::nan("")).dump(), "\"nan\"");
+  EXPECT_EQ(losslessNumber(-INFINITY).dump(), "\"-inf\"");
+  EXPECT_EQ(losslessText("a\xff").dump(), R"({"hex":"61ff"})");
+}
+
+TEST(LosslessText, TellsUtf8FromOtherOctets) {
+  struct Row {
+    const char* name;
+    std::string text;
+    bool isUtf8;
+  };
+  const Row rows[] = {
+      {"nothing", "", true},
+      {"the octet zero", std::string(1, '\0'), true},
+      {"the first of two octets", "\xc2\x80", true},
+      {"the last of two octets", "\xdf\xbf", true},
+      {"a longer form than needed, of two", "\xc1\xbf", false},
+      {"the first of three octets", "\xe0\xa0\x80", true},
+      {"a longer form than needed, of three", "\xe0\x9f\xbf", false},
+      {"the last before the surrogates", "\xed\x9f\xbf", true},
+      {"the first surrogate", "\xed\xa0\x80", false},
+      {"the first after the surrogates", "\xee\x80\x80", true},
+      {"the last of three octets", "\xef\xbf\xbf", true},
+      {"the first of four octets", "\xf0\x90\x80\x80", true},
+      {"a longer form than needed, of four", "\xf0\x8f\xbf\xbf", false},
+      {"the last of four octets", "\xf4\x8f\xbf\xbf", true},
+      {"beyond the last", "\xf4\x90\x80\x80", false},
+      {"an octet that never begins anything", "\xf5\x80\x80\x80", false},
+      {"a following octet alone", "\x80", false},
+      {"two octets without the second", "\xc2", false},
+      {"three octets without the third", "\xe2\x82", false},
+      {"four octets without the fourth", "\xf0\x9f\x98", false},
+      {"a third octet that does not follow", "\xe2\x82z", false},
+      {"a fourth octet that does not follow", "\xf0\x9f\x98z", false},
+  };
+  for (const Row& row : rows) {
+    const Json json = losslessText(row.text);
+    EXPECT_EQ(json.is_string(), row.isUtf8) << row.name;
+    EXPECT_EQ(textFrom(throughText(json)), row.text) << row.name;
+  }
+}
+
+TEST(LosslessText, AgreesWithTheJsonLibraryOnWhatIsUtf8) {
+  RandomValues random(3);
+  for (int i = 0; i < 20'000; ++i) {
+    const std::string text = random.text();
+    bool accepted = true;
+    try {
+      static_cast<void>(Json(text).dump());
+    } catch (const Json::exception&) {
+      accepted = false;
+    }
+    ASSERT_EQ(losslessText(text).is_string(), accepted) << testing::PrintToString(text);
+  }
+}
+
+TEST(LosslessResult, KeepsEveryResult) {
+  RandomValues random(4);
+  for (int i = 0; i < 5'000; ++i) {
+    const QZMeasuredResult result = random.result();
+    ASSERT_TRUE(isSame(resultFrom(throughText(losslessResult(result))), result)) << losslessResult(result).dump();
+  }
+}
+
+TEST(LosslessResult, HasThisForm) {
+  QZMeasuredResult result("Count", Measurement(90, QZDimensionlessUnit::frames()));
+  EXPECT_EQ(losslessResult(result).dump(), R"({"name":"Count","measurement":[90.0,"frames"]})");
+  QZLimit limit("Enough");
+  limit.setLowerBound(std::make_shared<const QZBound>(Measurement(1, QZUnit::unitWithSymbol("x")), true));
+  result.setLimit(limit);
+  EXPECT_EQ(losslessResult(result).dump(), R"({"name":"Count","measurement":[90.0,"frames"],)"
+                                           R"("limit":{"name":"Enough","lower":[[1.0,"x"],true],"upper":null}})");
+}
+
+TEST(LosslessError, KeepsEveryErrorAndNone) {
+  RandomValues random(5);
+  for (int i = 0; i < 2'000; ++i) {
+    const DiagnosticErrorPtr error = random.error(3);
+    ASSERT_TRUE(isSame(errorFrom(throughText(losslessError(error))), error)) << losslessError(error).dump();
+  }
+  EXPECT_TRUE(losslessError(nullptr).is_null());
+  EXPECT_EQ(errorFrom(Json()), nullptr);
+}
+
+TEST(LosslessDictionary, KeepsTheOrderOfEntries) {
+  const Dictionary dictionary{{"b", 1}, {"a", 2}, {"", 3}};
+  EXPECT_TRUE(isSame(dictionaryFrom(throughText(losslessDictionary(dictionary))), dictionary));
+}
+
+TEST(ValueFrom, RefusesWhatItDoesNotHold) {
+  struct Row {
+    const char* json;
+    const char* problem;
+  };
+  constexpr Row kRows[] = {
+      {"5", "a value is not an object with one key"},
+      {"{}", "a value is not an object with one key"},
+      {R"({"signed":1,"double":1.0})", "a value is not an object with one key"},
+      {R"({"thing":1})", "there is no kind of value 'thing'"},
+      {R"({"boolean":1})", "there is no boolean"},
+      {R"({"signed":1.5})", "there is no integer"},
+      {R"({"signed":"1"})", "there is no integer"},
+      {R"({"signed":9223372036854775808})", "an integer is too large"},
+      {R"({"unsigned":-1})", "there is no unsigned integer"},
+      {R"({"double":"NaN"})", "there is no number"},
+      {R"({"double":null})", "there is no number"},
+      {R"({"float":true})", "there is no number"},
+      {R"({"string":5})", "there is no string"},
+      {R"({"string":{"hax":"00"}})", "\"hex\" is missing"},
+      {R"({"string":{"hex":5}})", "there is no string"},
+      {R"({"string":{"hex":"0"}})", "hexadecimal digits are not in pairs"},
+      {R"({"string":{"hex":"0G"}})", "a hexadecimal digit is wrong"},
+      {R"({"string":{"hex":"A0"}})", "a hexadecimal digit is wrong"},
+      {R"({"bytes":5})", "there is no string"},
+      {R"({"bytes":"abc"})", "hexadecimal digits are not in pairs"},
+      {R"({"array":{}})", "there is no array"},
+      {R"({"array":[5]})", "a value is not an object with one key"},
+      {R"({"dictionary":{}})", "there is no array"},
+      {R"({"dictionary":[5]})", "there is no array"},
+      {R"({"dictionary":[["k"]]})", "an entry is not a key and a value"},
+      {R"({"dictionary":[[5,{"signed":1}]]})", "there is no string"},
+      {R"({"date":1.0})", "there is no integer"},
+      {R"({"error":5})", "there is no object"},
+      {R"({"error":{"code":1,"userInfo":[]}})", "\"domain\" is missing"},
+      {R"({"error":{"domain":"D","userInfo":[]}})", "\"code\" is missing"},
+      {R"({"error":{"domain":"D","code":1}})", "\"userInfo\" is missing"},
+      {R"({"error":{"domain":"D","code":"1","userInfo":[]}})", "there is no integer"},
+      {R"({"object":5})", "there is no string"},
+  };
+  for (const Row& row : kRows) {
+    EXPECT_THAT(problemOf([&] { valueFrom(Json::parse(row.json)); }), HasSubstr(row.problem)) << row.json;
+  }
+}
+
+TEST(ResultFrom, RefusesWhatIsNoResult) {
+  struct Row {
+    const char* json;
+    const char* problem;
+  };
+  constexpr Row kRows[] = {
+      {"[]", "there is no object"},
+      {R"({"measurement":[1.0,"x"]})", "\"name\" is missing"},
+      {R"({"name":"n"})", "\"measurement\" is missing"},
+      {R"({"name":"n","measurement":5})", "there is no array"},
+      {R"({"name":"n","measurement":[1.0]})", "a measurement is not a number and a unit"},
+      {R"({"name":"n","measurement":["x",1.0]})", "there is no number"},
+      {R"({"name":"n","measurement":[1.0,"x"],"limit":5})", "there is no object"},
+      {R"({"name":"n","measurement":[1.0,"x"],"limit":{"name":"l","upper":null}})", "\"lower\" is missing"},
+      {R"({"name":"n","measurement":[1.0,"x"],"limit":{"name":"l","lower":null}})", "\"upper\" is missing"},
+      {R"({"name":"n","measurement":[1.0,"x"],"limit":{"name":"l","lower":5,"upper":null}})", "there is no array"},
+      {R"({"name":"n","measurement":[1.0,"x"],"limit":{"name":"l","lower":[[1.0,"x"]],"upper":null}})",
+       "a bound is not a measurement and a boolean"},
+      {R"({"name":"n","measurement":[1.0,"x"],"limit":{"name":"l","lower":null,"upper":[[1.0,"x"],1]}})",
+       "there is no boolean"},
+  };
+  for (const Row& row : kRows) {
+    EXPECT_THAT(problemOf([&] { resultFrom(Json::parse(row.json)); }), HasSubstr(row.problem)) << row.json;
+  }
+}
+
+TEST(ValueFrom, RefusesWhatIsTooDeepInsteadOfRunningOutOfStack) {
+  constexpr std::size_t kLevels = 100'000;
+  std::string text;
+  for (std::size_t i = 0; i < kLevels; ++i) text += R"({"array":[)";
+  for (std::size_t i = 0; i < kLevels; ++i) text += "]}";
+  EXPECT_THAT(problemOf([&] { valueFrom(Json::parse(text)); }), HasSubstr("too many levels"));
+}
+
+TEST(MemberOf, TellsWhatIsMissing) {
+  EXPECT_EQ(memberOf(Json{{"a", 5}}, "a"), 5);
+  EXPECT_EQ(problemOf([] { memberOf(Json{{"a", 5}}, "b"); }), "\"b\" is missing");
+  EXPECT_EQ(problemOf([] { memberOf(Json::array(), "b"); }), "there is no object where one is due");
+}
+
+}  // namespace
+}  // namespace quazor

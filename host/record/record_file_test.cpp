@@ -1,0 +1,281 @@
+#include "host/record/record_file.h"
+
+#include "host/error/exit_code.h"
+#include "host/record/run_event_json.h"
+#include "host/testing/test_directory.h"
+#include "host/testing/test_events.h"
+
+#include <fcntl.h>
+#include <gmock/gmock.h>
+#include <gtest/gtest.h>
+#include <sys/resource.h>
+#include <sys/stat.h>
+#include <unistd.h>
+
+#include <algorithm>
+#include <csignal>
+#include <functional>
+#include <iterator>
+#include <vector>
+
+namespace quazor {
+namespace {
+
+namespace fs = std::filesystem;
+using testing::AllOf;
+using testing::HasSubstr;
+using testing::StartsWith;
+
+std::string refusalOf(ExitCode code, const std::function<void()>& action) {
+  try {
+    action();
+  } catch (const Refusal& refusal) {
+    EXPECT_EQ(refusal.code(), code);
+    return refusal.what();
+  }
+  return "accepted";
+}
+
+std::vector<std::string> linesOf(const std::string& text) {
+  std::vector<std::string> lines;
+  std::istringstream stream(text);
+  for (std::string line; std::getline(stream, line);) lines.push_back(line);
+  return lines;
+}
+
+std::string textOf(const std::vector<std::string>& lines) {
+  std::string text;
+  for (const std::string& line : lines) text += line + "\n";
+  return text;
+}
+
+class RecordFileTest : public testing::Test {
+ protected:
+  void write(const std::vector<RunEvent>& events) const {
+    RecordWriter writer(file_);
+    for (const RunEvent& event : events) writer.take(event);
+    EXPECT_EQ(writer.problem(), "");
+  }
+
+  std::string refusalOfText(const std::string& text) const {
+    const fs::path file = directory_.write("bad", text);
+    const std::string refusal = refusalOf(ExitCode::kCannotRead, [&] { readRecord(file); });
+    EXPECT_THAT(refusal, StartsWith("the record '" + file.string() + "'"));
+    return refusal;
+  }
+
+  TestDirectory directory_;
+  const fs::path file_ = directory_.path() / "record";
+};
+
+TEST_F(RecordFileTest, ReadsBackWhatWasWritten) {
+  const std::vector<RunEvent> events = wholeRun();
+  write(events);
+  const StoredRecord stored = readRecord(file_);
+  EXPECT_FALSE(stored.cutOff);
+  ASSERT_EQ(stored.events.size(), events.size());
+  for (std::size_t i = 0; i < events.size(); ++i) EXPECT_EQ(eventJson(stored.events[i]), eventJson(events[i]));
+}
+
+TEST_F(RecordFileTest, HasALineForEachEventWithItsNumber) {
+  write(wholeRun());
+  const std::vector<std::string> lines = linesOf(directory_.read("record"));
+  ASSERT_EQ(lines.size(), wholeRun().size());
+  EXPECT_THAT(lines[0], StartsWith(R"({"sequence":0,"record":1,"event":"runBegan",)"));
+  EXPECT_THAT(lines[1], StartsWith(R"({"sequence":1,"event":"diagnosticBegan",)"));
+}
+
+TEST_F(RecordFileTest, HoldsEachEventAsSoonAsItWasTaken) {
+  RecordWriter writer(file_);
+  EXPECT_EQ(directory_.read("record"), "");
+  EXPECT_EQ(writer.file(), file_);
+  std::size_t taken = 0;
+  for (const RunEvent& event : wholeRun()) {
+    writer.take(event);
+    const std::string text = directory_.read("record");
+    EXPECT_EQ(std::count(text.begin(), text.end(), '\n'), static_cast<std::ptrdiff_t>(++taken));
+    EXPECT_EQ(text.back(), '\n');
+  }
+}
+
+TEST_F(RecordFileTest, GivesTheWholeLinesOfARecordThatWasCutOffAnywhere) {
+  const std::vector<RunEvent> events = {
+      runOf({"A\n\u00e4"}), beginningOf("A\n\u00e4"), StageBegan{Stage::kRun, momentAt(2)},
+      DiagnosticEnded{Verdict::kError, momentAt(3)}, RunEnded{std::nullopt, momentAt(4)}};
+  write(events);
+  const std::string whole = directory_.read("record");
+  const fs::path cut = directory_.path() / "cut";
+  for (std::size_t size = 0; size <= whole.size(); ++size) {
+    const std::string text = whole.substr(0, size);
+    directory_.write("cut", text);
+    const auto lines = static_cast<std::size_t>(std::count(text.begin(), text.end(), '\n'));
+    if (lines == 0) {
+      EXPECT_THAT(refusalOf(ExitCode::kCannotRead, [&] { readRecord(cut); }), HasSubstr("holds no event")) << size;
+      continue;
+    }
+    const StoredRecord stored = readRecord(cut);
+    ASSERT_EQ(stored.events.size(), lines) << size;
+    EXPECT_EQ(stored.cutOff, text.back() != '\n') << size;
+    for (std::size_t i = 0; i < lines; ++i) EXPECT_EQ(eventJson(stored.events[i]), eventJson(events[i])) << size;
+  }
+}
+
+TEST_F(RecordFileTest, RefusesARecordThatWasChanged) {
+  write(wholeRun());
+  const std::vector<std::string> lines = linesOf(directory_.read("record"));
+  const auto changed = [&lines](const std::function<void(std::vector<std::string>&)>& change) {
+    std::vector<std::string> copy = lines;
+    change(copy);
+    return textOf(copy);
+  };
+  const auto replaced = [&](std::size_t at, const std::string& what, const std::string& by) {
+    return changed([&](auto& copy) { copy[at].replace(copy[at].find(what), what.size(), by); });
+  };
+  EXPECT_THAT(refusalOfText(replaced(3, R"("sequence":3)", R"("sequence":4)")),
+              HasSubstr("line 4: it has the sequence number 4 instead of 3; a line is missing or has been moved"));
+  EXPECT_THAT(refusalOfText(replaced(3, R"("sequence":3)", R"("sequence":"3")")), HasSubstr("sequence number \"3\""));
+  EXPECT_THAT(refusalOfText(replaced(3, R"("sequence":3)", R"("number":3)")),
+              HasSubstr("line 4: \"sequence\" is missing"));
+  for (std::size_t i = 0; i + 1 < lines.size(); ++i) {
+    const std::string without = changed([i](auto& copy) { copy.erase(copy.begin() + static_cast<std::ptrdiff_t>(i)); });
+    EXPECT_NE(refusalOfText(without), "accepted") << i;
+  }
+  EXPECT_THAT(refusalOfText(changed([](auto& copy) { std::swap(copy[4], copy[5]); })), HasSubstr("line 5: "));
+  EXPECT_THAT(refusalOfText(changed([](auto& copy) { copy[2] = "garbage"; })), HasSubstr("line 3: it is no JSON"));
+  EXPECT_THAT(refusalOfText(changed([](auto& copy) { copy[2] = ""; })), HasSubstr("line 3: it is no JSON"));
+  EXPECT_THAT(refusalOfText(changed([](auto& copy) { copy[2] = "[2]"; })), HasSubstr("line 3: there is no object"));
+  EXPECT_THAT(refusalOfText(replaced(2, "stageBegan", "stageBegun")),
+              HasSubstr("line 3: there is no event 'stageBegun'"));
+  EXPECT_THAT(refusalOfText(replaced(0, R"("record":1)", R"("record":2)")),
+              HasSubstr("line 1: it has form 2, and this program reads form 1"));
+  EXPECT_THAT(refusalOfText(replaced(0, R"("record":1)", R"("recorder":1)")), HasSubstr("\"record\" is missing"));
+}
+
+TEST_F(RecordFileTest, RefusesWhatIsNoRecord) {
+  EXPECT_THAT(refusalOfText(""), HasSubstr("holds no event"));
+  EXPECT_THAT(refusalOfText("no end of the line"), HasSubstr("holds no event"));
+  EXPECT_THAT(refusalOfText("\n"), HasSubstr("line 1: it is no JSON"));
+  EXPECT_THAT(refusalOfText(std::string("\x7f"
+                                        "ELF\x02\x01\0\0\n",
+                                        9)),
+              HasSubstr("line 1: it is no JSON"));
+  EXPECT_THAT(refusalOfText("{\"schema\": 1}\n"), HasSubstr("line 1: \"record\" is missing"));
+  EXPECT_THAT(refusalOfText("{\"sequence\":0,\"record\":1,\"event\":\"diagnosticCompleted\"}\n"),
+              HasSubstr("line 1: a record begins with the event runBegan"));
+}
+
+TEST_F(RecordFileTest, RefusesWhatCannotBeRead) {
+  const auto refusalOfFile = [](const fs::path& file) {
+    return refusalOf(ExitCode::kCannotRead, [&] { readRecord(file); });
+  };
+  EXPECT_EQ(refusalOfFile(directory_.path() / "nothing"),
+            "the record '" + (directory_.path() / "nothing").string() + "' cannot be read: No such file or directory");
+  EXPECT_EQ(refusalOfFile(directory_.path()),
+            "the record '" + directory_.path().string() + "' cannot be read: it is a directory");
+  EXPECT_THAT(refusalOfFile(directory_.write("file", "") / "x"), HasSubstr("cannot be read: Not a directory"));
+  EXPECT_EQ(refusalOfFile("/proc/self/mem"), "the record '/proc/self/mem' cannot be read to its end");
+}
+
+TEST_F(RecordFileTest, TakesThePlaceOfAnOldFileAtOnce) {
+  directory_.write("record", "old");
+  const int old = ::open(file_.c_str(), O_RDONLY);
+  const RecordWriter writer(file_);
+  EXPECT_EQ(directory_.read("record"), "");
+  char text[4] = {};
+  EXPECT_EQ(::read(old, text, sizeof text), 3);  // whoever reads the old one is not disturbed
+  ::close(old);
+  EXPECT_EQ(std::distance(fs::directory_iterator(directory_.path()), fs::directory_iterator()), 1);
+}
+
+TEST_F(RecordFileTest, FollowsALink) {
+  directory_.write("target", "old");
+  fs::create_symlink("target", file_);
+  write(wholeRun());
+  EXPECT_TRUE(fs::is_symlink(file_));
+  EXPECT_THAT(directory_.read("target"), StartsWith("{\"sequence\":0"));
+}
+
+TEST_F(RecordFileTest, WritesToWhatIsNoRegularFileAsItIs) {
+  ASSERT_EQ(mkfifo(file_.c_str(), 0600), 0);
+  const int reader = ::open(file_.c_str(), O_RDONLY | O_NONBLOCK);
+  ASSERT_GE(reader, 0);
+  RecordWriter writer(file_);
+  writer.take(runOf({}));
+  char text[13] = {};
+  EXPECT_EQ(::read(reader, text, 12), 12);
+  EXPECT_STREQ(text, "{\"sequence\":");
+  EXPECT_TRUE(fs::is_fifo(file_));
+  ::close(reader);
+}
+
+TEST_F(RecordFileTest, RefusesAFileThatCannotBeMade) {
+  const auto refusalOfFile = [](const fs::path& file) {
+    return refusalOf(ExitCode::kCannotWrite, [&] { const RecordWriter writer(file); });
+  };
+  EXPECT_EQ(refusalOfFile(directory_.path()),
+            "the record '" + directory_.path().string() + "' cannot be written: it is a directory");
+  EXPECT_THAT(refusalOfFile(directory_.path() / "nowhere" / "x"),
+              HasSubstr("cannot be written: No such file or directory"));
+  EXPECT_THAT(refusalOfFile(directory_.write("file", "") / "x"), HasSubstr("cannot be written: Not a directory"));
+  EXPECT_THAT(refusalOfFile(directory_.path() / std::string(250, 'x')), HasSubstr("File name too long"));
+  fs::create_symlink("itself", directory_.path() / "itself");
+  EXPECT_THAT(refusalOfFile(directory_.path() / "itself" / "x"), HasSubstr("Too many levels of symbolic links"));
+}
+
+TEST_F(RecordFileTest, TellsWhyItCouldNotBeWrittenAndWritesNoMore) {
+  RecordWriter writer("/dev/full");
+  EXPECT_EQ(writer.problem(), "");
+  writer.take(runOf({}));
+  EXPECT_EQ(writer.problem(), "No space left on device");
+  writer.take(RunEnded{std::nullopt, momentAt(1)});
+  EXPECT_EQ(writer.problem(), "No space left on device");
+}
+
+TEST_F(RecordFileTest, EndsInACutOffLineWhenTheDiskIsFull) {
+  rlimit before{};
+  ASSERT_EQ(getrlimit(RLIMIT_FSIZE, &before), 0);
+  const auto handler = std::signal(SIGXFSZ, SIG_IGN);
+  RecordWriter writer(file_);
+  const rlimit small{700, before.rlim_max};  // octets that a file may have
+  ASSERT_EQ(setrlimit(RLIMIT_FSIZE, &small), 0);
+  for (const RunEvent& event : wholeRun()) writer.take(event);
+  setrlimit(RLIMIT_FSIZE, &before);
+  std::signal(SIGXFSZ, handler);
+  EXPECT_EQ(writer.problem(), "File too large");
+  EXPECT_EQ(fs::file_size(file_), 700U);
+  const StoredRecord stored = readRecord(file_);
+  EXPECT_TRUE(stored.cutOff);
+  EXPECT_GE(stored.events.size(), 1U);
+}
+
+TEST_F(RecordFileTest, MakesRecordsOfTheRunInIt) {
+  write(wholeRun());
+  const RecordedRun run = runIn(file_);
+  EXPECT_EQ(run.began.phone, "phone.json");
+  EXPECT_EQ(run.began.seed, 5U);
+  ASSERT_EQ(run.records.size(), 4U);
+  EXPECT_EQ(run.records[0].name, "Good");
+  EXPECT_EQ(run.records[0].verdict, Verdict::kPass);
+  EXPECT_EQ(run.records[1].verdict, Verdict::kFail);
+  EXPECT_EQ(run.records[2].verdict, Verdict::kError);
+  EXPECT_EQ(run.records[3].verdict, Verdict::kError);
+  ASSERT_TRUE(run.ended);
+  EXPECT_EQ(run.ended->date, momentAt(99));
+}
+
+TEST_F(RecordFileTest, TakesADiagnosticThatItDoesNotHoldToTheEndForAnError) {
+  std::vector<RunEvent> events = wholeRun();
+  const auto firstEnd = std::find_if(events.begin(), events.end(), [](const RunEvent& event) {
+    return std::holds_alternative<DiagnosticEnded>(event);
+  });
+  events.erase(firstEnd, events.end());
+  write(events);
+  const RecordedRun run = runIn(file_);
+  ASSERT_EQ(run.records.size(), 1U);
+  EXPECT_EQ(run.records[0].verdict, Verdict::kError);
+  EXPECT_EQ(run.records[0].measuredResults.size(), 1U);
+  EXPECT_FALSE(run.ended);
+}
+
+}  // namespace
+}  // namespace quazor

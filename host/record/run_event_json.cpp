@@ -1,0 +1,371 @@
+#include "host/record/run_event_json.h"
+
+#include "host/record/lossless_json.h"
+#include "host/text/timestamp.h"
+
+#include <concepts>
+#include <string>
+#include <string_view>
+#include <utility>
+#include <vector>
+
+namespace quazor {
+
+using Json = nlohmann::ordered_json;
+
+namespace {
+
+template <class T>
+bool isInteger(const Json& json) {
+  if (json.is_number_unsigned()) return std::in_range<T>(json.get<std::uint64_t>());
+  return json.is_number_integer() && std::in_range<T>(json.get<std::int64_t>());
+}
+
+template <class T>
+T get(const Json& json, const char* key) {
+  const Json& member = memberOf(json, key);
+  bool fits = true;
+  if constexpr (std::integral<T> && !std::same_as<T, bool>) fits = isInteger<T>(member);
+  try {
+    if (fits) return member.get<T>();
+  } catch (const Json::exception&) {
+  }
+  throw BadRecord(std::string("\"") + key + "\" is of the wrong kind");
+}
+
+std::string textAt(const Json& json, const char* key) { return textFrom(memberOf(json, key)); }
+
+Date dateAt(const Json& json, const char* key) {
+  const std::optional<Date> date = parseTimestamp(get<std::string>(json, key));
+  if (!date) throw BadRecord(std::string("\"") + key + "\" is no time stamp");
+  return *date;
+}
+
+const Json& arrayAt(const Json& json, const char* key) {
+  const Json& array = memberOf(json, key);
+  if (!array.is_array()) throw BadRecord(std::string("\"") + key + "\" is no array");
+  return array;
+}
+
+Stage stageAt(const Json& json, const char* key) {
+  const std::string name = get<std::string>(json, key);
+  const std::optional<Stage> stage = stageNamed(name);
+  if (!stage) throw BadRecord("there is no stage '" + name + "'");
+  return *stage;
+}
+
+Json textsJson(const std::vector<std::string>& texts) {
+  Json json = Json::array();
+  for (const std::string& text : texts) json.push_back(losslessText(text));
+  return json;
+}
+
+std::vector<std::string> textsAt(const Json& json, const char* key) {
+  std::vector<std::string> texts;
+  for (const Json& one : arrayAt(json, key)) texts.push_back(textFrom(one));
+  return texts;
+}
+
+Json parametersJson(const std::vector<BoundParameter>& parameters) {
+  Json json = Json::array();
+  for (const BoundParameter& one : parameters) {
+    Json parameter = {{"name", losslessText(one.name)},
+                      {"summary", losslessText(one.declaration.summary())},
+                      {"required", one.declaration.required()}};
+    if (one.value) {
+      parameter["value"] = losslessValue(*one.value);
+      parameter["source"] = losslessText(one.source);
+    }
+    json.push_back(std::move(parameter));
+  }
+  return json;
+}
+
+std::vector<BoundParameter> parametersAt(const Json& json, const char* key) {
+  std::vector<BoundParameter> parameters;
+  for (const Json& one : arrayAt(json, key)) {
+    BoundParameter parameter{
+        textAt(one, "name"), QZNumberParameter(textAt(one, "summary"), get<bool>(one, "required")), std::nullopt, {}};
+    if (one.contains("value")) {
+      parameter.value = valueFrom(one["value"]);
+      parameter.source = textAt(one, "source");
+    }
+    parameters.push_back(std::move(parameter));
+  }
+  return parameters;
+}
+
+LogLevel levelAt(const Json& json, const char* key) {
+  const std::string name = get<std::string>(json, key);
+  for (const LogLevel level : {LogLevel::kError, LogLevel::kDefault, LogLevel::kDebug}) {
+    if (nameOf(level) == name) return level;
+  }
+  throw BadRecord("there is no log level '" + name + "'");
+}
+
+Verdict verdictAt(const Json& json, const char* key) {
+  const std::string name = get<std::string>(json, key);
+  for (const Verdict verdict : {Verdict::kPass, Verdict::kFail, Verdict::kError}) {
+    if (nameOf(verdict) == name) return verdict;
+  }
+  throw BadRecord("there is no verdict '" + name + "'");
+}
+
+std::chrono::nanoseconds nanosecondsAt(const Json& json, const char* key) {
+  return std::chrono::nanoseconds(get<std::int64_t>(json, key));
+}
+
+// One overload per event, each the reverse of its read function below.
+
+Json jsonOf(const RunBegan& event) {
+  return {{"event", "runBegan"},
+          {"program", event.program},
+          {"contract", event.contract},
+          {"date", timestampText(event.date)},
+          {"plugins", textsJson(event.plugins)},
+          {"phone", losslessText(event.phone)},
+          {"seed", event.seed},
+          {"ofExperiments", event.ofExperiments},
+          {"names", textsJson(event.names)}};
+}
+
+RunEvent readRunBegan(const Json& json) {
+  return RunBegan{textAt(json, "program"),          get<int>(json, "contract"), dateAt(json, "date"),
+                  textsAt(json, "plugins"),         textAt(json, "phone"),      get<std::uint64_t>(json, "seed"),
+                  get<bool>(json, "ofExperiments"), textsAt(json, "names")};
+}
+
+Json jsonOf(const DiagnosticBegan& event) {
+  return {{"event", "diagnosticBegan"},
+          {"name", losslessText(event.name)},
+          {"summary", losslessText(event.summary)},
+          {"experiment", losslessText(event.experimentName)},
+          {"analysis", losslessText(event.analysisName)},
+          {"experimentOnly", event.experimentOnly},
+          {"parameters",
+           {{"experiment", parametersJson(event.parameters.experiment)},
+            {"analysis", parametersJson(event.parameters.analysis)}}},
+          {"seed", event.seed},
+          {"date", timestampText(event.date)}};
+}
+
+RunEvent readDiagnosticBegan(const Json& json) {
+  const Json& parameters = memberOf(json, "parameters");
+  return DiagnosticBegan{textAt(json, "name"),
+                         textAt(json, "summary"),
+                         textAt(json, "experiment"),
+                         textAt(json, "analysis"),
+                         get<bool>(json, "experimentOnly"),
+                         {parametersAt(parameters, "experiment"), parametersAt(parameters, "analysis")},
+                         get<std::uint64_t>(json, "seed"),
+                         dateAt(json, "date")};
+}
+
+Json jsonOf(const StageBegan& event) {
+  return {{"event", "stageBegan"}, {"stage", nameOf(event.stage)}, {"date", timestampText(event.date)}};
+}
+
+RunEvent readStageBegan(const Json& json) { return StageBegan{stageAt(json, "stage"), dateAt(json, "date")}; }
+
+Json jsonOf(const StageEnded& event) {
+  Json json = {{"event", "stageEnded"}, {"stage", nameOf(event.stage)}};
+  if (event.duration) json["nanoseconds"] = event.duration->count();
+  json["date"] = timestampText(event.date);
+  return json;
+}
+
+RunEvent readStageEnded(const Json& json) {
+  StageEnded event{stageAt(json, "stage"), std::nullopt, dateAt(json, "date")};
+  if (json.contains("nanoseconds")) event.duration = nanosecondsAt(json, "nanoseconds");
+  return event;
+}
+
+Json jsonOf(const Logged& event) {
+  return {{"event", "log"},
+          {"date", timestampText(event.line.date)},
+          {"nanoseconds", event.line.time.count()},
+          {"level", nameOf(event.line.level)},
+          {"text", losslessText(event.line.text)}};
+}
+
+RunEvent readLogged(const Json& json) {
+  return Logged{
+      {nanosecondsAt(json, "nanoseconds"), levelAt(json, "level"), textAt(json, "text"), dateAt(json, "date")}};
+}
+
+Json jsonOf(const Measured& event) {
+  Json measurements = Json::array();
+  for (const auto& [name, measurement] : event.measurements) {
+    measurements.push_back(Json::array({losslessText(name), losslessMeasurement(measurement)}));
+  }
+  return {{"event", "measured"}, {"measurements", std::move(measurements)}};
+}
+
+RunEvent readMeasured(const Json& json) {
+  Measured event;
+  for (const Json& one : arrayAt(json, "measurements")) {
+    if (!one.is_array() || one.size() != 2) throw BadRecord("a measurement has not a name and a value");
+    event.measurements.emplace_back(textFrom(one[0]), measurementFrom(one[1]));
+  }
+  return event;
+}
+
+Json jsonOf(const Collected& event) {
+  return {{"event", "collected"}, {"key", losslessText(event.key)}, {"value", losslessValue(event.value)}};
+}
+
+RunEvent readCollected(const Json& json) { return Collected{textAt(json, "key"), valueFrom(memberOf(json, "value"))}; }
+
+Json jsonOf(const Found& event) {
+  Json results = Json::array();
+  for (const QZMeasuredResult& result : event.results) results.push_back(losslessResult(result));
+  return {{"event", "found"}, {"results", std::move(results)}};
+}
+
+RunEvent readFound(const Json& json) {
+  Found event;
+  for (const Json& one : arrayAt(json, "results")) event.results.push_back(resultFrom(one));
+  return event;
+}
+
+Json jsonOf(const Failed& event) {
+  Json json = {{"event", "failed"}};
+  if (event.stage) json["stage"] = nameOf(*event.stage);
+  json["error"] = losslessError(event.error);
+  return json;
+}
+
+RunEvent readFailed(const Json& json) {
+  Failed event{std::nullopt, errorFrom(memberOf(json, "error"))};
+  if (event.error == nullptr) throw BadRecord("a failure has no error");
+  if (json.contains("stage")) event.stage = stageAt(json, "stage");
+  return event;
+}
+
+Json jsonOf(const FaultsCounted& event) {
+  Json faults = Json::array();
+  for (const DeclaredFault& one : event.faults) faults.push_back({{"fault", one.fault}, {"fired", one.fired}});
+  return {{"event", "faultsCounted"}, {"faults", std::move(faults)}};
+}
+
+RunEvent readFaultsCounted(const Json& json) {
+  FaultsCounted event;
+  for (const Json& one : arrayAt(json, "faults")) {
+    event.faults.push_back({memberOf(one, "fault"), get<std::uint64_t>(one, "fired")});
+  }
+  return event;
+}
+
+Json jsonOf(const DiagnosticCompleted& /*event*/) { return {{"event", "diagnosticCompleted"}}; }
+
+RunEvent readDiagnosticCompleted(const Json& /*json*/) { return DiagnosticCompleted{}; }
+
+Json jsonOf(const DiagnosticEnded& event) {
+  return {{"event", "diagnosticEnded"}, {"verdict", nameOf(event.verdict)}, {"date", timestampText(event.date)}};
+}
+
+RunEvent readDiagnosticEnded(const Json& json) {
+  return DiagnosticEnded{verdictAt(json, "verdict"), dateAt(json, "date")};
+}
+
+Json jsonOf(const RunEnded& event) {
+  Json json = {{"event", "runEnded"}};
+  if (event.interrupted) json["interrupted"] = losslessText(*event.interrupted);
+  json["date"] = timestampText(event.date);
+  return json;
+}
+
+RunEvent readRunEnded(const Json& json) {
+  RunEnded event{std::nullopt, dateAt(json, "date")};
+  if (json.contains("interrupted")) event.interrupted = textAt(json, "interrupted");
+  return event;
+}
+
+struct Reader {
+  std::string_view name;
+  RunEvent (*read)(const Json& json);
+};
+
+constexpr Reader kReaders[] = {{"runBegan", readRunBegan},
+                               {"diagnosticBegan", readDiagnosticBegan},
+                               {"stageBegan", readStageBegan},
+                               {"stageEnded", readStageEnded},
+                               {"log", readLogged},
+                               {"measured", readMeasured},
+                               {"collected", readCollected},
+                               {"found", readFound},
+                               {"failed", readFailed},
+                               {"faultsCounted", readFaultsCounted},
+                               {"diagnosticCompleted", readDiagnosticCompleted},
+                               {"diagnosticEnded", readDiagnosticEnded},
+                               {"runEnded", readRunEnded}};
+
+Json halfJson(const QZDescription& description) {
+  Json parameters = Json::array();
+  for (const auto& [name, parameter] : description.parameters()) {
+    parameters.push_back({{"name", losslessText(name)},
+                          {"summary", losslessText(parameter.summary())},
+                          {"required", parameter.required()}});
+  }
+  return {{"summary", losslessText(description.summary())}, {"parameters", std::move(parameters)}};
+}
+
+QZDescription halfFrom(const Json& json) {
+  QZDescription description(textAt(json, "summary"));
+  for (const Json& one : arrayAt(json, "parameters")) {
+    description.addParameter(QZNumberParameter(textAt(one, "summary"), get<bool>(one, "required")),
+                             textAt(one, "name"));
+  }
+  return description;
+}
+
+}  // namespace
+
+Json eventJson(const RunEvent& event) {
+  return std::visit([](const auto& one) { return jsonOf(one); }, event);
+}
+
+RunEvent eventFrom(const Json& json) {
+  const std::string name = get<std::string>(json, "event");
+  for (const Reader& reader : kReaders) {
+    if (reader.name == name) return reader.read(json);
+  }
+  throw BadRecord("there is no event '" + name + "'");
+}
+
+Json diagnosticJson(const Diagnostic& diagnostic) {
+  return {{"name", losslessText(diagnostic.name)},
+          {"summary", losslessText(diagnostic.summary)},
+          {"experiment", losslessText(diagnostic.experimentName)},
+          {"analysis", losslessText(diagnostic.analysisName)},
+          {"experimentOnly", diagnostic.experimentOnly},
+          {"usedBy", textsJson(diagnostic.usedBy)},
+          {"plugins", textsJson({diagnostic.plugins.begin(), diagnostic.plugins.end()})}};
+}
+
+Diagnostic diagnosticFrom(const Json& json) {
+  const std::vector<std::string> plugins = textsAt(json, "plugins");
+  return {textAt(json, "name"),
+          textAt(json, "summary"),
+          textAt(json, "experiment"),
+          textAt(json, "analysis"),
+          nullptr,
+          nullptr,
+          get<bool>(json, "experimentOnly"),
+          textsAt(json, "usedBy"),
+          {plugins.begin(), plugins.end()}};
+}
+
+Json descriptionJson(const DiagnosticDescription& description) {
+  return {{"experiment", halfJson(description.experiment)},
+          {"analysis", halfJson(description.analysis)},
+          {"error", losslessError(description.error)},
+          {"isAsked", description.isAsked}};
+}
+
+DiagnosticDescription descriptionFrom(const Json& json) {
+  return {halfFrom(memberOf(json, "experiment")), halfFrom(memberOf(json, "analysis")),
+          errorFrom(memberOf(json, "error")), get<bool>(json, "isAsked")};
+}
+
+}  // namespace quazor

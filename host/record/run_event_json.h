@@ -1,0 +1,25 @@
+// Events in JSON: a line of a record, and of the connection between quazor and a diagnostic's process.
+// docs/record_format.md is the public description.
+#pragma once
+
+#include "host/model/run_event.h"
+
+#include <nlohmann/json.hpp>
+
+namespace quazor {
+
+nlohmann::ordered_json eventJson(const RunEvent& event);
+
+// Throws BadRecord (host/record/lossless_json.h) for what is no event.
+RunEvent eventFrom(const nlohmann::ordered_json& json);
+
+// What is run: name, summary, halves and who uses it.
+nlohmann::ordered_json diagnosticJson(const Diagnostic& diagnostic);
+// Without factories. Throws BadRecord.
+Diagnostic diagnosticFrom(const nlohmann::ordered_json& json);
+
+nlohmann::ordered_json descriptionJson(const DiagnosticDescription& description);
+// Throws BadRecord.
+DiagnosticDescription descriptionFrom(const nlohmann::ordered_json& json);
+
+}  // namespace quazor

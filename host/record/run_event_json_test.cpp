@@ -1,0 +1,260 @@
+#include "host/record/run_event_json.h"
+
+#include "host/record/lossless_json.h"
+#include "host/testing/test_events.h"
+#include "host/testing/test_values.h"
+
+#include <gmock/gmock.h>
+#include <gtest/gtest.h>
+
+#include <limits>
+#include <set>
+
+namespace quazor {
+namespace {
+
+using Json = nlohmann::ordered_json;
+using namespace std::chrono_literals;
+using testing::HasSubstr;
+
+RunEvent back(const RunEvent& event) { return eventFrom(Json::parse(eventJson(event).dump())); }
+
+std::string problemOf(const Json& json) {
+  try {
+    eventFrom(json);
+  } catch (const BadRecord& problem) {
+    return problem.what();
+  }
+  return "accepted";
+}
+
+struct Row {
+  RunEvent event;
+  const char* json;
+};
+
+// Each event with everything that it can have.
+std::vector<Row> rows() {
+  RunBegan run = runOf({"Good", "B\xff"});
+  run.ofExperiments = true;
+  run.seed = UINT64_MAX;
+  DiagnosticBegan diagnostic = beginningOf("Good");
+  diagnostic.experimentOnly = true;
+  const DiagnosticErrorPtr error = errorWithMessage("D", -2, "m", nullptr);
+  return {
+      {run, R"({"event":"runBegan","program":"0.1.0","contract":2,"date":"2026-11-21T01:08:00.000000000Z",)"
+            R"("plugins":["p.so"],"phone":"phone.json","seed":18446744073709551615,"ofExperiments":true,)"
+            R"("names":["Good",{"hex":"42ff"}]})"},
+      {diagnostic,
+       R"({"event":"diagnosticBegan","name":"Good","summary":"Its summary.","experiment":"E","analysis":"A",)"
+       R"("experimentOnly":true,"parameters":{"experiment":[{"name":"duration","summary":"How long.",)"
+       R"("required":true,"value":{"signed":3},"source":"command line"}],"analysis":[{"name":"gain",)"
+       R"("summary":"How much.","required":false}]},"seed":5,"date":"2026-11-21T01:08:00.001000000Z"})"},
+      {StageBegan{Stage::kTeardown, momentAt(7)},
+       R"({"event":"stageBegan","stage":"teardown","date":"2026-11-21T01:08:00.007000000Z"})"},
+      {StageEnded{Stage::kRun, 3s, momentAt(7)},
+       R"({"event":"stageEnded","stage":"run","nanoseconds":3000000000,"date":"2026-11-21T01:08:00.007000000Z"})"},
+      {Logged{{-1ns, LogLevel::kDebug, "a\nline", momentAt(7)}},
+       R"({"event":"log","date":"2026-11-21T01:08:00.007000000Z","nanoseconds":-1,"level":"debug","text":"a\nline"})"},
+      {Measured{{{"R", Measurement(0.5, QZUnit::unitWithSymbol("V"))}}},
+       R"({"event":"measured","measurements":[["R",[0.5,"V"]]]})"},
+      {Collected{"k", Value(Array{1U})}, R"({"event":"collected","key":"k","value":{"array":[{"unsigned":1}]}})"},
+      {Found{{QZMeasuredResult("R", Measurement(1, QZUnit::unitWithSymbol("V")))}},
+       R"({"event":"found","results":[{"name":"R","measurement":[1.0,"V"]}]})"},
+      {Failed{Stage::kSetup, error}, R"({"event":"failed","stage":"setup","error":{"domain":"D","code":-2,)"
+                                     R"("userInfo":[["localized-description",{"string":"m"}]]}})"},
+      {FaultsCounted{{{{{"operation", "x"}}, 4}}},
+       R"({"event":"faultsCounted","faults":[{"fault":{"operation":"x"},"fired":4}]})"},
+      {DiagnosticCompleted{}, R"({"event":"diagnosticCompleted"})"},
+      {DiagnosticEnded{Verdict::kFail, momentAt(7)},
+       R"({"event":"diagnosticEnded","verdict":"fail","date":"2026-11-21T01:08:00.007000000Z"})"},
+      {RunEnded{"Good", momentAt(7)},
+       R"({"event":"runEnded","interrupted":"Good","date":"2026-11-21T01:08:00.007000000Z"})"},
+  };
+}
+
+TEST(EventJson, HasAFormForEveryEvent) {
+  std::set<std::size_t> kinds;
+  for (const Row& row : rows()) {
+    EXPECT_EQ(eventJson(row.event).dump(), row.json);
+    kinds.insert(row.event.index());
+  }
+  EXPECT_EQ(kinds.size(), std::variant_size_v<RunEvent>);
+}
+
+TEST(EventFrom, ReadsEveryEventBack) {
+  for (const Row& row : rows()) EXPECT_EQ(eventJson(back(row.event)).dump(), row.json);
+}
+
+TEST(EventFrom, ReadsBackWhatIsLeftOut) {
+  const std::vector<RunEvent> events = {
+      StageEnded{Stage::kRun, std::nullopt, momentAt(7)},
+      Failed{std::nullopt, errorWithMessage("D", 1, "m", nullptr)},
+      RunEnded{std::nullopt, momentAt(7)},
+      RunEnded{"", momentAt(7)},
+      Measured{},
+      Found{},
+      FaultsCounted{},
+  };
+  for (const RunEvent& event : events) {
+    EXPECT_EQ(eventJson(back(event)).dump(), eventJson(event).dump());
+  }
+  EXPECT_EQ(std::get<RunEnded>(back(RunEnded{"", momentAt(7)})).interrupted, "");
+  EXPECT_EQ(std::get<RunEnded>(back(RunEnded{std::nullopt, momentAt(7)})).interrupted, std::nullopt);
+}
+
+TEST(EventFrom, KeepsEveryContent) {
+  RandomValues random(1);
+  for (int i = 0; i < 1000; ++i) {
+    const std::string key = random.text();
+    const Value value = random.value(3);
+    const auto collected = std::get<Collected>(back(Collected{key, value}));
+    ASSERT_EQ(collected.key, key);
+    ASSERT_TRUE(isSame(collected.value, value));
+
+    const QZMeasuredResult result = random.result();
+    const auto found = std::get<Found>(back(Found{{result, result}}));
+    ASSERT_EQ(found.results.size(), 2U);
+    ASSERT_TRUE(isSame(found.results[1], result));
+
+    const Measurement measurement = random.measurement();
+    const auto measured = std::get<Measured>(back(Measured{{{key, measurement}}}));
+    ASSERT_EQ(measured.measurements[0].first, key);
+    ASSERT_TRUE(isSame(measured.measurements[0].second, measurement));
+
+    const DiagnosticErrorPtr error = random.error(2);
+    const auto failed = std::get<Failed>(back(Failed{kStages[random.below(std::size(kStages))], error}));
+    ASSERT_TRUE(isSame(failed.error, error));
+
+    const LogLine line{std::chrono::nanoseconds(static_cast<std::int64_t>(random.bits())), LogLevel::kError,
+                       random.text(), random.date()};
+    const auto logged = std::get<Logged>(back(Logged{line})).line;
+    ASSERT_EQ(logged.time, line.time);
+    ASSERT_EQ(logged.text, line.text);
+    ASSERT_EQ(logged.date, line.date);
+  }
+}
+
+TEST(EventFrom, KnowsEveryStageLevelAndVerdict) {
+  for (const Stage stage : kStages) {
+    EXPECT_EQ(std::get<StageBegan>(back(StageBegan{stage, momentAt(1)})).stage, stage);
+  }
+  for (const LogLevel level : {LogLevel::kError, LogLevel::kDefault, LogLevel::kDebug}) {
+    EXPECT_EQ(std::get<Logged>(back(Logged{{1ns, level, "", momentAt(1)}})).line.level, level);
+  }
+  for (const Verdict verdict : {Verdict::kPass, Verdict::kFail, Verdict::kError}) {
+    EXPECT_EQ(std::get<DiagnosticEnded>(back(DiagnosticEnded{verdict, momentAt(1)})).verdict, verdict);
+  }
+}
+
+// What an event may be without.
+bool isOptional(const std::string& event, const std::string& key) {
+  return (event == "failed" && key == "stage") || (event == "stageEnded" && key == "nanoseconds") ||
+         (event == "runEnded" && key == "interrupted");
+}
+
+TEST(EventFrom, RefusesAnEventWithoutOneOfItsMembers) {
+  int removed = 0;
+  for (const Row& row : rows()) {
+    const Json whole = Json::parse(row.json);
+    for (const auto& [key, ignored] : whole.items()) {
+      Json without = whole;
+      without.erase(key);
+      const bool optional = isOptional(whole["event"], key);
+      EXPECT_EQ(problemOf(without), optional ? "accepted" : "\"" + key + "\" is missing") << row.json;
+      ++removed;
+    }
+  }
+  EXPECT_EQ(removed, 49);
+}
+
+TEST(EventFrom, RefusesMembersOfAnotherKind) {
+  for (const Row& row : rows()) {
+    const Json whole = Json::parse(row.json);
+    for (const auto& [key, member] : whole.items()) {
+      for (const char* other : {"null", "0.5", "[0.5]", "{\"a\":0.5}", "\"strange\"", "-1e300"}) {
+        Json changed = whole;
+        changed[key] = Json::parse(other);
+        if (changed[key].type() == member.type() && member.is_string() && key != "event" && key != "date" &&
+            key != "stage" && key != "level" && key != "verdict") {
+          continue;  // any text
+        }
+        EXPECT_NE(problemOf(changed), "accepted") << key << " as " << other << " in " << row.json;
+      }
+    }
+  }
+}
+
+TEST(EventFrom, SaysWhatIsWrong) {
+  struct BadRow {
+    const char* json;
+    const char* problem;
+  };
+  constexpr BadRow kRows[] = {
+      {"5", "there is no object"},
+      {R"({"event":5})", "\"event\" is of the wrong kind"},
+      {R"({"event":"runbegan"})", "there is no event 'runbegan'"},
+      {R"({"event":"stageBegan","stage":"pause","date":""})", "there is no stage 'pause'"},
+      {R"({"event":"stageBegan","stage":"run","date":"today"})", "\"date\" is no time stamp"},
+      {R"({"event":"stageEnded","stage":"run","date":"2026-11-21T01:08:00.000000000Z","nanoseconds":1.5})",
+       "\"nanoseconds\" is of the wrong kind"},
+      {R"({"event":"stageEnded","stage":"run","date":"2026-11-21T01:08:00.000000000Z",)"
+       R"("nanoseconds":9223372036854775808})",
+       "\"nanoseconds\" is of the wrong kind"},
+      {R"({"event":"log","nanoseconds":1,"level":"loud","text":"","date":"2026-11-21T01:08:00.000000000Z"})",
+       "there is no log level 'loud'"},
+      {R"({"event":"diagnosticEnded","verdict":"maybe","date":"2026-11-21T01:08:00.000000000Z"})",
+       "there is no verdict 'maybe'"},
+      {R"({"event":"failed","error":null})", "a failure has no error"},
+      {R"({"event":"measured","measurements":{}})", "\"measurements\" is no array"},
+      {R"({"event":"measured","measurements":[["R"]]})", "a measurement has not a name and a value"},
+      {R"({"event":"measured","measurements":["R"]})", "a measurement has not a name and a value"},
+      {R"({"event":"faultsCounted","faults":[{"fired":1}]})", "\"fault\" is missing"},
+      {R"({"event":"faultsCounted","faults":[{"fault":{},"fired":-1}]})", "\"fired\" is of the wrong kind"},
+  };
+  for (const BadRow& row : kRows) EXPECT_THAT(problemOf(Json::parse(row.json)), HasSubstr(row.problem)) << row.json;
+}
+
+TEST(EventFrom, RefusesAParameterWithAValueFromNowhere) {
+  Json json = Json::parse(rows()[1].json);
+  json["parameters"]["experiment"][0].erase("source");
+  EXPECT_EQ(problemOf(json), "\"source\" is missing");
+}
+
+TEST(DiagnosticFrom, ReadsADiagnosticBackWithoutItsFactories) {
+  const Diagnostic diagnostic{"N\xff", "S", "E", "A", nullptr, nullptr, true, {"U", "V"}, {"a/p.so", "q\xff.so"}};
+  const Diagnostic read = diagnosticFrom(Json::parse(diagnosticJson(diagnostic).dump()));
+  EXPECT_EQ(read.name, diagnostic.name);
+  EXPECT_EQ(read.summary, "S");
+  EXPECT_EQ(read.experimentName, "E");
+  EXPECT_EQ(read.analysisName, "A");
+  EXPECT_EQ(read.makeExperiment, nullptr);
+  EXPECT_EQ(read.makeAnalysis, nullptr);
+  EXPECT_TRUE(read.experimentOnly);
+  EXPECT_EQ(read.usedBy, diagnostic.usedBy);
+  EXPECT_EQ(read.plugins, diagnostic.plugins);
+  EXPECT_THROW(diagnosticFrom(Json::parse(R"({"name":"N"})")), BadRecord);
+}
+
+TEST(DescriptionFrom, ReadsADescriptionBack) {
+  DiagnosticDescription description{QZDescription("E"), QZDescription("A"), errorWithMessage("D", 1, "m", nullptr)};
+  description.experiment.addParameter(QZNumberParameter("b's", true), "b");
+  description.experiment.addParameter(QZNumberParameter("a's", false), "a");
+  const DiagnosticDescription read = descriptionFrom(Json::parse(descriptionJson(description).dump()));
+  EXPECT_EQ(read.experiment.summary(), "E");
+  EXPECT_EQ(read.analysis.summary(), "A");
+  ASSERT_EQ(read.experiment.parameters().size(), 2U);
+  EXPECT_EQ(read.experiment.parameters().begin()->first, "b");
+  EXPECT_TRUE(read.experiment.parameters().find("b")->required());
+  EXPECT_EQ(read.experiment.parameters().find("a")->summary(), "a's");
+  EXPECT_FALSE(read.experiment.parameters().find("a")->required());
+  EXPECT_TRUE(isSame(read.error, description.error));
+  EXPECT_EQ(descriptionFrom(descriptionJson({})).error, nullptr);
+  EXPECT_TRUE(read.isAsked);
+  description.isAsked = false;
+  EXPECT_FALSE(descriptionFrom(descriptionJson(description)).isAsked);
+  EXPECT_THROW(descriptionFrom(Json::parse(R"({"experiment":{}})")), BadRecord);
+}
+
+}  // namespace
+}  // namespace quazor

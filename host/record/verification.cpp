@@ -1,0 +1,102 @@
+#include "host/record/verification.h"
+
+#include "contract/message_format.h"
+#include "host/error/host_error.h"
+#include "host/model/record_builder.h"
+#include "host/model/verdict_of_record.h"
+
+#include <algorithm>
+#include <cstdint>
+#include <utility>
+
+namespace quazor {
+
+namespace {
+
+// The host could not write a record, which has nothing to do with what the diagnostic told.
+bool isNotRecorded(const DiagnosticError& error) {
+  return error.domain() == QuazorHostErrorDomain &&
+         error.code() == static_cast<std::int64_t>(HostErrorCode::kNotRecorded);
+}
+
+std::string textOf(const DiagnosticErrorPtr& error) {
+  if (error == nullptr) return "none";
+  return formatMessage("%@ %@ '%@'", error->domain(), error->code(), error->localizedDescription());
+}
+
+class Verifier {
+ public:
+  void take(const RunEvent& event) {
+    if (const auto* const failed = std::get_if<Failed>(&event); failed != nullptr && !failed->stage) {
+      hostsWord_ = failed->error;  // the host's own, which must follow from the rest
+      if (!builder_.isOpen()) add("a failure stands outside of a diagnostic");
+      return;
+    }
+    checkPlace(event);
+    builder_.take(event);
+    if (std::holds_alternative<DiagnosticBegan>(event)) hostsWord_ = nullptr;
+    if (std::holds_alternative<DiagnosticEnded>(event)) checkVerdict();
+  }
+
+  std::vector<std::string> problems;
+
+ private:
+  void checkPlace(const RunEvent& event) {
+    if (ended_) add("there are events after the end of the run");
+    const bool begins = std::holds_alternative<DiagnosticBegan>(event);
+    if (const auto* const began = std::get_if<RunBegan>(&event)) {
+      if (began_) add("the run begins twice");
+      began_ = true;
+      toRun_ = began->names;
+    } else if (const auto* const ended = std::get_if<RunEnded>(&event)) {
+      if (builder_.isOpen()) add("the run ends while " + builder_.record().name + " has not ended");
+      if (!ended->interrupted) checkNames();
+      ended_ = true;
+    } else if (begins == builder_.isOpen()) {
+      add(begins ? builder_.record().name + " has not ended when the next diagnostic begins"
+                 : "an event stands outside of a diagnostic");
+    }
+  }
+
+  void checkNames() {
+    for (const std::string& name : toRun_) {
+      if (std::find(run_.begin(), run_.end(), name) == run_.end()) add(name + " was to run and is missing");
+    }
+  }
+
+  void checkVerdict() {
+    const DiagnosticRecord& record = builder_.record();
+    run_.push_back(record.name);
+    RecordJudgement judged = judgeRecord(record, builder_.isCompleted());
+    const DiagnosticErrorPtr due = record.error == nullptr ? judged.error : nullptr;
+    if (hostsWord_ != nullptr && isNotRecorded(*hostsWord_)) {
+      judged.verdict = Verdict::kError;
+    } else if (textOf(hostsWord_) != textOf(due)) {
+      add(formatMessage("%@ has the failure %@ of quazor's own, but %@ follows from its results, limits and errors",
+                        record.name, textOf(hostsWord_), textOf(due)));
+    }
+    if (judged.verdict != record.verdict) {
+      add(formatMessage("%@ has the verdict %@, but %@ follows from its results, limits and errors", record.name,
+                        nameOf(record.verdict), nameOf(judged.verdict)));
+    }
+  }
+
+  void add(std::string problem) { problems.push_back(std::move(problem)); }
+
+  RecordBuilder builder_;
+  DiagnosticErrorPtr hostsWord_;
+  std::vector<std::string> toRun_;
+  std::vector<std::string> run_;
+  bool began_ = false;
+  bool ended_ = false;
+};
+
+}  // namespace
+
+std::vector<std::string> problemsOf(const std::vector<RunEvent>& events) {
+  Verifier verifier;
+  for (const RunEvent& event : events) verifier.take(event);
+  return std::move(verifier.problems);
+}
+
+}  // namespace quazor

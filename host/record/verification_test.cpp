@@ -1,0 +1,197 @@
+#include "host/record/verification.h"
+
+#include "host/error/host_error.h"
+#include "host/testing/test_events.h"
+
+#include <gmock/gmock.h>
+#include <gtest/gtest.h>
+
+#include <algorithm>
+#include <functional>
+#include <limits>
+
+namespace quazor {
+namespace {
+
+using testing::ElementsAre;
+using testing::HasSubstr;
+using testing::IsEmpty;
+
+using Events = std::vector<RunEvent>;
+
+// The place of the event of that kind in the diagnostic of that name.
+template <class Event>
+Events::iterator find(Events& events, const std::string& diagnostic) {
+  const auto begin = std::find_if(events.begin(), events.end(), [&](const RunEvent& event) {
+    const auto* const began = std::get_if<DiagnosticBegan>(&event);
+    return began != nullptr && began->name == diagnostic;
+  });
+  return std::find_if(begin, events.end(), [](const RunEvent& event) { return std::holds_alternative<Event>(event); });
+}
+
+std::vector<std::string> problemsAfter(const std::function<void(Events&)>& change) {
+  Events events = wholeRun();
+  change(events);
+  return problemsOf(events);
+}
+
+void replaceResult(Events& events, const std::string& diagnostic, const QZMeasuredResult& result) {
+  std::get<Found>(*find<Found>(events, diagnostic)).results[0] = result;
+}
+
+QZMeasuredResult withUnit(const char* unit) {
+  QZMeasuredResult result("Count", Measurement(90, QZUnit::unitWithSymbol(unit)));
+  result.setLimit(*resultOf(90).limit());
+  return result;
+}
+
+QZMeasuredResult withMinimum(double minimum) {
+  QZMeasuredResult result = resultOf(90);
+  QZLimit limit("Enough");
+  limit.setLowerBound(std::make_shared<const QZBound>(Measurement(minimum, QZDimensionlessUnit::frames()), false));
+  result.setLimit(limit);
+  return result;
+}
+
+TEST(ProblemsOf, FindsNoneInAWholeRun) { EXPECT_THAT(problemsOf(wholeRun()), IsEmpty()); }
+
+TEST(ProblemsOf, FindsNoneInAnyBeginningOfARun) {
+  Events events = wholeRun();
+  while (!events.empty()) {
+    EXPECT_THAT(problemsOf(events), IsEmpty()) << events.size();
+    events.pop_back();
+  }
+  EXPECT_THAT(problemsOf({}), IsEmpty());
+}
+
+TEST(ProblemsOf, FindsAVerdictThatDoesNotFollow) {
+  for (const char* name : {"Good", "Bad", "Strange", "Broken"}) {
+    for (const Verdict verdict : {Verdict::kPass, Verdict::kFail, Verdict::kError}) {
+      Events events = wholeRun();
+      Verdict& stored = std::get<DiagnosticEnded>(*find<DiagnosticEnded>(events, name)).verdict;
+      if (stored == verdict) continue;
+      const std::string right(nameOf(stored));
+      stored = verdict;
+      EXPECT_THAT(problemsOf(events),
+                  ElementsAre(std::string(name) + " has the verdict " + std::string(nameOf(verdict)) + ", but " +
+                              right + " follows from its results, limits and errors"));
+    }
+  }
+}
+
+TEST(ProblemsOf, FindsChangesOfWhatTheVerdictFollowsFrom) {
+  struct Row {
+    const char* name;
+    std::function<void(Events&)> change;
+    const char* problem;
+  };
+  const double nan = std::numeric_limits<double>::quiet_NaN();
+  const Row rows[] = {
+      {"a value that fails", [](Events& e) { replaceResult(e, "Good", resultOf(89)); }, "Good has the verdict pass"},
+      {"a value that passes", [](Events& e) { replaceResult(e, "Bad", resultOf(90)); }, "Bad has the verdict fail"},
+      {"a value that is no number", [&](Events& e) { replaceResult(e, "Good", resultOf(nan)); },
+       "Good has the verdict pass"},
+      {"a value that was no number", [](Events& e) { replaceResult(e, "Strange", resultOf(90)); },
+       "Strange has the failure QuazorHostErrorDomain 5"},
+      {"a limit", [](Events& e) { replaceResult(e, "Good", withMinimum(91)); }, "Good has the verdict pass"},
+      {"a unit", [](Events& e) { replaceResult(e, "Good", withUnit("errors")); }, "Good has the verdict pass"},
+      {"no result any more", [](Events& e) { e.erase(find<Found>(e, "Good")); }, "Good has the verdict pass"},
+      {"no failing result any more", [](Events& e) { e.erase(find<Found>(e, "Bad")); }, "Bad has the verdict fail"},
+      {"another result that fails",
+       [](Events& e) { std::get<Found>(*find<Found>(e, "Good")).results.push_back(resultOf(1)); },
+       "Good has the verdict pass"},
+      {"an error that was not",
+       [](Events& e) {
+         e.insert(find<DiagnosticCompleted>(e, "Bad"), Failed{Stage::kRun, errorWithMessage("D", 1, "m", nullptr)});
+       },
+       "Bad has the verdict fail"},
+      {"no error any more", [](Events& e) { e.erase(find<Failed>(e, "Broken")); },
+       "Broken has the failure none of quazor's own, but QuazorHostErrorDomain 4 'nothing was measured' follows"},
+      {"no failure of quazor's own any more", [](Events& e) { e.erase(find<Failed>(e, "Strange")); },
+       "Strange has the failure none of quazor's own, but QuazorHostErrorDomain 5"},
+      {"another failure of quazor's own",
+       [](Events& e) {
+         *find<Failed>(e, "Strange") = Failed{std::nullopt, hostError(HostErrorCode::kNothingMeasured, "no")};
+       },
+       "Strange has the failure QuazorHostErrorDomain 4 'no' of quazor's own"},
+      {"a pass that was not completed", [](Events& e) { e.erase(find<DiagnosticCompleted>(e, "Good")); },
+       "Good has the verdict pass"},
+      {"a failure that was not completed", [](Events& e) { e.erase(find<DiagnosticCompleted>(e, "Bad")); },
+       "Bad has the verdict fail"},
+  };
+  for (const Row& row : rows) {
+    EXPECT_THAT(problemsAfter(row.change), testing::Contains(HasSubstr(row.problem))) << row.name;
+  }
+}
+
+TEST(ProblemsOf, FindsThatAnErrorWithResultsWasTakenOut) {
+  Events events = {runOf({"A"})};
+  for (RunEvent& event : wholeDiagnostic("A", 90)) events.push_back(std::move(event));
+  events.insert(events.end() - 1, Failed{Stage::kTeardown, errorWithMessage("D", 1, "m", nullptr)});
+  events.emplace_back(DiagnosticEnded{Verdict::kError, momentAt(9)});
+  EXPECT_THAT(problemsOf(events), IsEmpty());
+  events.erase(find<Failed>(events, "A"));
+  EXPECT_THAT(problemsOf(events), ElementsAre(HasSubstr("has the verdict error, but pass follows")));
+}
+
+TEST(ProblemsOf, TakesTheHostsWordThatItCouldNotWriteARecord) {
+  const Failed notRecorded{std::nullopt, hostError(HostErrorCode::kNotRecorded, "the record cannot be written")};
+  Events events = wholeRun();
+  events.insert(find<DiagnosticEnded>(events, "Good"), notRecorded);
+  EXPECT_THAT(problemsOf(events), ElementsAre(HasSubstr("Good has the verdict pass, but error follows")));
+  std::get<DiagnosticEnded>(*find<DiagnosticEnded>(events, "Good")).verdict = Verdict::kError;
+  EXPECT_THAT(problemsOf(events), IsEmpty());
+  const Failed another{std::nullopt, errorWithMessage("Domain", 10, "a plug-in's", nullptr)};
+  *find<Failed>(events, "Good") = another;
+  EXPECT_THAT(problemsOf(events), testing::Contains(HasSubstr("Good has the verdict error, but pass follows")));
+}
+
+TEST(ProblemsOf, FindsEventsThatAreOutOfPlace) {
+  struct Row {
+    const char* name;
+    std::function<void(Events&)> change;
+    const char* problem;
+  };
+  const Row rows[] = {
+      {"a second beginning", [](Events& e) { e.insert(e.begin() + 1, runOf({})); }, "the run begins twice"},
+      {"a line between two diagnostics", [](Events& e) { e.insert(e.begin() + 1, Logged{}); },
+       "an event stands outside of a diagnostic"},
+      {"a verdict without a diagnostic",
+       [](Events& e) {
+         e.insert(e.begin() + 1, DiagnosticEnded{Verdict::kPass, momentAt(1)});
+       },
+       "an event stands outside of a diagnostic"},
+      {"a failure between two diagnostics",
+       [](Events& e) {
+         e.insert(e.begin() + 1, Failed{std::nullopt, errorWithMessage("D", 1, "m", nullptr)});
+       },
+       "a failure stands outside of a diagnostic"},
+      {"a diagnostic that does not end", [](Events& e) { e.erase(find<DiagnosticEnded>(e, "Good")); },
+       "Good has not ended when the next diagnostic begins"},
+      {"a run that ends too early",
+       [](Events& e) {
+         e.insert(e.begin() + 2, RunEnded{"Good", momentAt(1)});
+       },
+       "the run ends while Good has not ended"},
+      {"something after the end", [](Events& e) { e.emplace_back(beginningOf("Late")); },
+       "there are events after the end of the run"},
+  };
+  for (const Row& row : rows) {
+    EXPECT_THAT(problemsAfter(row.change), testing::Contains(row.problem)) << row.name;
+  }
+}
+
+TEST(ProblemsOf, FindsADiagnosticThatWasTakenOut) {
+  const auto without = [](Events& events) {
+    events.erase(find<DiagnosticBegan>(events, "Bad"), find<DiagnosticBegan>(events, "Strange"));
+  };
+  EXPECT_THAT(problemsAfter(without), ElementsAre("Bad was to run and is missing"));
+  EXPECT_THAT(problemsAfter([&](Events& events) {
+                without(events);
+                events.back() = RunEnded{"Broken", momentAt(99)};  // as if it had not come so far
+              }),
+              IsEmpty());
+}
+
+}  // namespace
+}  // namespace quazor

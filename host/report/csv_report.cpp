@@ -1,0 +1,156 @@
+#include "host/report/csv_report.h"
+
+#include "contract/message_format.h"
+#include "host/report/sample_images.h"
+
+#include <algorithm>
+#include <cstddef>
+#include <map>
+#include <set>
+#include <utility>
+
+namespace quazor {
+
+namespace {
+
+// The columns' groups, from left to right; in a group columns are in the order of their names.
+enum class Group { kExperiment, kImage, kOfImage, kSample, kSamples, kMeasurement, kValue, kUnit };
+using Column = std::pair<Group, std::string>;
+using Row = std::map<Column, std::string>;
+
+Column experimentColumn() { return {Group::kExperiment, "experiment"}; }
+Column measurementColumn() { return {Group::kMeasurement, "measurement"}; }
+Column valueColumn() { return {Group::kValue, "value"}; }
+Column unitColumn() { return {Group::kUnit, "unit"}; }
+
+template <class Visit>
+void visitImage(const Row& base, const Dictionary& image, Visit&& visit) {
+  Row row = base;
+  std::size_t count = 0;
+  for (const auto& [name, value] : image) {
+    if (isSamples(value)) {
+      count = std::max(count, value.array()->size());
+    } else {
+      row[{Group::kOfImage, name}] = defaultText(value);
+    }
+  }
+  for (std::size_t sample = 0; sample < count; ++sample) {
+    row[{Group::kSample, "sample"}] = std::to_string(sample);
+    for (const auto& [name, value] : image) {
+      if (!isSamples(value)) continue;
+      const Array& samples = *value.array();
+      row[{Group::kSamples, name}] = sample < samples.size() ? defaultText(samples[sample]) : std::string();
+    }
+    visit(row);
+  }
+}
+
+// Calls `visit` with every row, one at a time.
+template <class Visit>
+void visitRows(const std::vector<DiagnosticRecord>& records, Visit&& visit) {
+  for (const DiagnosticRecord& record : records) {
+    Row row{{experimentColumn(), record.name}};
+    std::size_t number = 0;
+    for (const auto& [ignored, value] : record.auxiliaryData) {
+      for (const Dictionary* const image : imagesIn(value)) {
+        row[{Group::kImage, "image"}] = std::to_string(++number);
+        visitImage(row, *image, visit);
+      }
+    }
+    for (const auto& [name, measurement] : record.measurements) {
+      visit(Row{{experimentColumn(), record.name},
+                {measurementColumn(), name},
+                {valueColumn(), defaultText(measurement.value())},
+                {unitColumn(), measurement.unit().symbol()}});
+    }
+  }
+}
+
+void appendLine(std::string& csv, const std::vector<std::string_view>& fields) {
+  std::string_view separator;
+  for (const std::string_view field : fields) {
+    csv += separator;
+    csv += csvField(field);
+    separator = ",";
+  }
+  csv += '\n';
+}
+
+const std::vector<std::string_view> kDiagnosticColumns = {
+    "diagnostic", "verdict",   "result",        "value",      "unit",        "limit",     "lower",       "lowerOpen",
+    "upper",      "upperOpen", "resultVerdict", "errorStage", "errorDomain", "errorCode", "errorMessage"};
+
+// The four cells of a limit's bounds, and its name before them.
+void addLimit(std::vector<std::string>& cells, const std::optional<QZLimit>& limit) {
+  cells.push_back(limit ? limit->name() : std::string());
+  for (const auto which : {&QZLimit::lowerBound, &QZLimit::upperBound}) {
+    const QZBound* const bound = limit ? ((*limit).*which)().get() : nullptr;
+    cells.push_back(bound == nullptr ? std::string() : defaultText(bound->value().value()));
+    cells.push_back(bound == nullptr ? std::string() : defaultText(bound->open()));
+  }
+}
+
+// A line of the diagnostic; `judged` is null for one without results.
+void appendDiagnosticLine(std::string& csv, const DiagnosticRecord& record, const JudgedResult* judged) {
+  std::vector<std::string> cells{record.name, std::string(nameOf(record.verdict))};
+  if (judged != nullptr) {
+    const Measurement& measurement = judged->result.measurement();
+    cells.insert(cells.end(), {judged->result.name(), defaultText(measurement.value()), measurement.unit().symbol()});
+    addLimit(cells, judged->result.limit());
+    cells.emplace_back(nameOf(judged->verdict));
+  } else {
+    cells.resize(kDiagnosticColumns.size() - 4);
+  }
+  if (const DiagnosticErrorPtr& error = record.error; error != nullptr) {
+    cells.emplace_back(record.errorStage ? nameOf(*record.errorStage) : std::string_view());
+    cells.insert(cells.end(), {error->domain(), std::to_string(error->code()), error->localizedDescription()});
+  }
+  cells.resize(kDiagnosticColumns.size());
+  appendLine(csv, {cells.begin(), cells.end()});
+}
+
+}  // namespace
+
+std::string csvField(std::string_view text) {
+  if (text.find_first_of(",\"\r\n") == std::string_view::npos) return std::string(text);
+  std::string field = "\"";
+  for (const char unit : text) {
+    if (unit == '"') field += '"';
+    field += unit;
+  }
+  return field + "\"";
+}
+
+std::string experimentCsv(const std::vector<DiagnosticRecord>& records) {
+  std::set<Column> columns;
+  visitRows(records, [&columns](const Row& row) {
+    for (const auto& [column, ignored] : row) columns.insert(column);
+  });
+  if (columns.empty()) columns = {experimentColumn(), measurementColumn(), valueColumn(), unitColumn()};
+  std::string csv;
+  std::vector<std::string_view> fields;
+  fields.reserve(columns.size());
+  for (const Column& column : columns) fields.emplace_back(column.second);
+  appendLine(csv, fields);
+  visitRows(records, [&](const Row& row) {
+    fields.clear();
+    for (const Column& column : columns) {
+      const auto cell = row.find(column);
+      fields.push_back(cell == row.end() ? std::string_view() : std::string_view(cell->second));
+    }
+    appendLine(csv, fields);
+  });
+  return csv;
+}
+
+std::string diagnosticCsv(const std::vector<DiagnosticRecord>& records) {
+  std::string csv;
+  appendLine(csv, kDiagnosticColumns);
+  for (const DiagnosticRecord& record : records) {
+    for (const JudgedResult& judged : record.measuredResults) appendDiagnosticLine(csv, record, &judged);
+    if (record.measuredResults.empty()) appendDiagnosticLine(csv, record, nullptr);
+  }
+  return csv;
+}
+
+}  // namespace quazor

@@ -1,0 +1,184 @@
+#include "host/report/json_report.h"
+
+#include "host/record/value_json.h"
+
+#include <utility>
+
+namespace quazor {
+
+using Json = nlohmann::ordered_json;
+
+namespace {
+
+constexpr int kSchema = 1;
+
+Json documentOf(const char* key, Json records) { return {{"schema", kSchema}, {key, std::move(records)}}; }
+
+Json runDocumentOf(const char* key, Json records, const std::optional<std::string>& interrupted) {
+  Json document = documentOf(key, std::move(records));
+  if (interrupted) document["interrupted"] = *interrupted;
+  return document;
+}
+
+Json boundJson(const std::shared_ptr<const QZBound>& bound) {
+  if (bound == nullptr) return {};
+  return {{"value", numberJson(bound->value().value())}, {"open", bound->open()}};
+}
+
+Json limitJson(const std::optional<QZLimit>& limit) {
+  if (!limit) return {};
+  return {
+      {"name", limit->name()}, {"lower", boundJson(limit->lowerBound())}, {"upper", boundJson(limit->upperBound())}};
+}
+
+Json resultsJson(const std::vector<JudgedResult>& results) {
+  Json json = Json::array();
+  for (const auto& [result, verdict] : results) {
+    json.push_back({{"name", result.name()},
+                    {"value", numberJson(result.measurement().value())},
+                    {"unit", result.measurement().unit().symbol()},
+                    {"limit", limitJson(result.limit())},
+                    {"verdict", nameOf(verdict)}});
+  }
+  return json;
+}
+
+Json measurementsJson(const OrderedMap<Measurement>& measurements) {
+  return objectJson(measurements, [](const Measurement& measurement) {
+    return Json{{"value", numberJson(measurement.value())}, {"unit", measurement.unit().symbol()}};
+  });
+}
+
+Json parametersJson(const BoundParameters& parameters) {
+  return {{"experiment", dictionaryJson(dictionaryOf(parameters.experiment))},
+          {"analysis", dictionaryJson(dictionaryOf(parameters.analysis))}};
+}
+
+Json logJson(const std::vector<LogLine>& lines) {
+  Json json = Json::array();
+  for (const LogLine& line : lines) {
+    json.push_back({{"time", secondsJson(line.time)}, {"level", nameOf(line.level)}, {"text", line.text}});
+  }
+  return json;
+}
+
+Json faultsJson(const std::vector<DeclaredFault>& faults) {
+  Json json = Json::array();
+  for (const DeclaredFault& fault : faults) {
+    Json one = fault.fault;
+    one["fired"] = fault.fired;
+    json.push_back(std::move(one));
+  }
+  return json;
+}
+
+Json durationJson(const std::optional<std::chrono::nanoseconds>& duration) {
+  return duration ? secondsJson(*duration) : Json();
+}
+
+// What a half declares, with the values of a run.
+Json declarationJson(const std::string& name, const QZDescription& description,
+                     const std::vector<BoundParameter>& parameters) {
+  Json json = Json::array();
+  for (const BoundParameter& one : parameters) {
+    json.push_back({{"name", one.name},
+                    {"summary", one.declaration.summary()},
+                    {"required", one.declaration.required()},
+                    {"value", one.value ? valueJson(*one.value) : Json()},
+                    {"source", one.value ? Json(one.source) : Json()}});
+  }
+  return {{"name", name}, {"summary", description.summary()}, {"parameters", std::move(json)}};
+}
+
+}  // namespace
+
+Json recordJson(const DiagnosticRecord& record) {
+  const StageDurations& durations = record.durations;
+  return {{"name", record.name},
+          {"summary", record.summary},
+          {"verdict", nameOf(record.verdict)},
+          {"parameters", parametersJson(record.parameters)},
+          {"measuredResults", resultsJson(record.measuredResults)},
+          {"measurements", measurementsJson(record.measurements)},
+          {"auxiliaryData", dictionaryJson(record.auxiliaryData)},
+          {"error", errorJson(record.error)},
+          {"log", logJson(record.log)},
+          {"faults", faultsJson(record.faults)},
+          {"seed", record.seed},
+          {"durations",
+           {{"setup", durationJson(durations.setup)},
+            {"run", durationJson(durations.run)},
+            {"teardown", durationJson(durations.teardown)},
+            {"analysis", durationJson(durations.analysis)}}}};
+}
+
+Json experimentJson(const DiagnosticRecord& record) {
+  const StageDurations& durations = record.durations;
+  return {{"name", record.name},
+          {"summary", record.summary},
+          {"verdict", nameOf(record.verdict)},
+          {"parameters", dictionaryJson(dictionaryOf(record.parameters.experiment))},
+          {"measurements", measurementsJson(record.measurements)},
+          {"auxiliaryData", dictionaryJson(record.auxiliaryData)},
+          {"error", errorJson(record.error)},
+          {"log", logJson(record.log)},
+          {"faults", faultsJson(record.faults)},
+          {"seed", record.seed},
+          {"durations",
+           {{"setup", durationJson(durations.setup)},
+            {"run", durationJson(durations.run)},
+            {"teardown", durationJson(durations.teardown)}}}};
+}
+
+Json runDocument(const std::vector<DiagnosticRecord>& records, const std::optional<std::string>& interrupted) {
+  Json diagnostics = Json::array();
+  for (const DiagnosticRecord& record : records) diagnostics.push_back(recordJson(record));
+  return runDocumentOf("diagnostics", std::move(diagnostics), interrupted);
+}
+
+Json experimentDocument(const std::vector<DiagnosticRecord>& records, const std::optional<std::string>& interrupted) {
+  Json experiments = Json::array();
+  for (const DiagnosticRecord& record : records) experiments.push_back(experimentJson(record));
+  return runDocumentOf("experiments", std::move(experiments), interrupted);
+}
+
+Json listDocument(const std::vector<DescribedDiagnostic>& diagnostics) {
+  Json document = documentOf("diagnostics", Json::array());
+  document["experiments"] = Json::array();
+  for (const DescribedDiagnostic& described : diagnostics) {
+    const Diagnostic& one = described.diagnostic;
+    if (one.experimentOnly) {
+      document["experiments"].push_back(
+          {{"name", one.name}, {"summary", described.description.error ? Json() : Json(described.summary())}});
+      continue;
+    }
+    document["diagnostics"].push_back({{"name", one.name},
+                                       {"summary", one.summary},
+                                       {"experiment", one.experimentName},
+                                       {"analysis", one.analysisName}});
+  }
+  return document;
+}
+
+Json descriptionDocument(const std::vector<BoundDiagnostic>& diagnostics) {
+  Json document = documentOf("diagnostics", Json::array());
+  document["experiments"] = Json::array();
+  for (const auto& [described, parameters] : diagnostics) {
+    const auto& [diagnostic, description] = described;
+    Json experiment = declarationJson(diagnostic.experimentName, description.experiment, parameters.experiment);
+    if (diagnostic.experimentOnly) {
+      experiment["error"] = errorJson(description.error);
+      document["experiments"].push_back(std::move(experiment));
+      continue;
+    }
+    document["diagnostics"].push_back(
+        {{"name", diagnostic.name},
+         {"summary", diagnostic.summary},
+         {"experiment", std::move(experiment)},
+         {"analysis", declarationJson(diagnostic.analysisName, description.analysis, parameters.analysis)},
+         {"error", errorJson(description.error)}});
+  }
+  return document;
+}
+
+}  // namespace quazor

@@ -1,0 +1,129 @@
+#include "host/report/junit_report.h"
+
+#include "contract/message_format.h"
+#include "host/error/host_error.h"
+#include "host/model/unfinished.h"
+#include "host/report/junit_suite.h"
+#include "host/report/text_report.h"
+
+#include <string_view>
+
+namespace quazor {
+
+namespace {
+
+std::string valueText(const Measurement& measurement) {
+  return formatMessage("%@ %@", measurement.value(), measurement.unit().symbol());
+}
+
+void addParameters(JUnitProperties& properties, std::string_view half, const std::vector<BoundParameter>& parameters) {
+  for (const BoundParameter& one : parameters) {
+    if (!one.value) continue;
+    properties.add(formatMessage("parameter.%@.%@", half, one.name), defaultText(*one.value));
+    properties.add(formatMessage("source.%@.%@", half, one.name), one.source);
+  }
+}
+
+void addBound(JUnitProperties& properties, const std::string& which, const std::shared_ptr<const QZBound>& bound) {
+  if (bound == nullptr) return;
+  properties.add(which, defaultText(bound->value().value()));
+  properties.add(which + "Open", bound->open() ? "true" : "false");
+}
+
+JUnitProperties propertiesOf(const JudgedResult& judged) {
+  const QZMeasuredResult& result = judged.result;
+  JUnitProperties properties;
+  properties.add("verdict", std::string(nameOf(judged.verdict)));
+  properties.add("value", defaultText(result.measurement().value()));
+  properties.add("unit", result.measurement().unit().symbol());
+  if (result.limit()) {
+    properties.add("limit", result.limit()->name());
+    addBound(properties, "lower", result.limit()->lowerBound());
+    addBound(properties, "upper", result.limit()->upperBound());
+  }
+  return properties;
+}
+
+// A result that cannot be judged is an error, not a failure, which would be the hardware's.
+void addResult(JUnitSuite& suite, const JudgedResult& judged) {
+  const QZMeasuredResult& result = judged.result;
+  const JUnitProperties properties = propertiesOf(judged);
+  if (judged.verdict != ResultVerdict::kFail) return suite.addPass(result.name(), properties);
+  if (const std::string problem = judgeResult(result).problem; !problem.empty()) {
+    return suite.addError(result.name(), properties, hostError(HostErrorCode::kCannotBeJudged, problem));
+  }
+  suite.addFailure(result.name(), properties,
+                   formatMessage("%@ is %@, and its limit %@", result.name(), valueText(result.measurement()),
+                                 limitText(result.limit())));
+}
+
+// What an experiment on its own measured.
+void addExperiment(JUnitSuite& suite, const DiagnosticRecord& record) {
+  JUnitProperties properties;
+  for (const auto& [name, measurement] : record.measurements) {
+    properties.add("measurement." + name, valueText(measurement));
+  }
+  suite.addPass("result", properties);
+}
+
+void addRun(JUnitProperties& properties, const RunBegan& run) {
+  properties.add("program", run.program);
+  properties.add("contract", std::to_string(run.contract));
+  for (const std::string& plugin : run.plugins) properties.add("plugin", plugin);
+  properties.add("phone", run.phone);
+}
+
+JUnitSuite suiteOf(const RunBegan& run, const DiagnosticRecord& record) {
+  JUnitSuite suite(record.name, record.begin, record.end);
+  JUnitProperties& properties = suite.properties();
+  properties.add("verdict", std::string(nameOf(record.verdict)));
+  properties.add("summary", record.summary);
+  properties.add("seed", std::to_string(record.seed));
+  addParameters(properties, "experiment", record.parameters.experiment);
+  addParameters(properties, "analysis", record.parameters.analysis);
+  addRun(properties, run);
+  for (const JudgedResult& one : record.measuredResults) addResult(suite, one);
+  if (record.experimentOnly && record.verdict != Verdict::kError) addExperiment(suite, record);
+  if (record.error != nullptr) {
+    suite.addError(record.errorStage ? std::string(nameOf(*record.errorStage)) : "judge", {}, record.error);
+  }
+  suite.addLog(record.log);
+  return suite;
+}
+
+JUnitSuite suiteOfUnfinished(const RunBegan& run, const std::string& name, Date date) {
+  JUnitSuite suite(name, date, date);
+  suite.properties().add("seed", std::to_string(run.seed));
+  addRun(suite.properties(), run);
+  return suite;
+}
+
+}  // namespace
+
+std::string junitReport(const RunBegan& run, const std::vector<DiagnosticRecord>& records,
+                        const std::optional<std::string>& interrupted) {
+  JUnitCounts counts;
+  std::string suites;
+  const auto add = [&counts, &suites](const JUnitSuite& suite) {
+    counts += suite.counts();
+    suites += suite.xml();
+  };
+  for (const DiagnosticRecord& record : records) add(suiteOf(run, record));
+  const Date end = records.empty() ? run.date : records.back().end;
+  const Unfinished unfinished = unfinishedOf(run, records, interrupted);
+  if (unfinished.interrupted) {
+    const std::string& name = *unfinished.interrupted;
+    JUnitSuite suite = suiteOfUnfinished(run, name.empty() ? "quazor" : name, end);
+    suite.addError("interrupted", {}, interruptionOf(name));
+    add(suite);
+  }
+  for (const std::string& name : unfinished.neverRun) {
+    JUnitSuite suite = suiteOfUnfinished(run, name, end);
+    suite.addSkipped("never-run", "The run ended before this was run.");
+    add(suite);
+  }
+  return "<?xml version=\"1.0\" encoding=\"UTF-8\"?>\n" + junitTag("testsuites", "quazor", counts, run.date) + suites +
+         "</testsuites>\n";
+}
+
+}  // namespace quazor

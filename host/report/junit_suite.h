@@ -1,0 +1,68 @@
+// JUnitSuite: one test suite of JUnit's XML.
+#pragma once
+
+#include "contract/diagnostic_error.h"
+#include "contract/value.h"
+#include "host/model/run_log.h"
+
+#include <chrono>
+#include <cstddef>
+#include <string>
+#include <vector>
+
+namespace quazor {
+
+// Names and values, in the order of their adding.
+class JUnitProperties {
+ public:
+  void add(const std::string& name, const std::string& value);
+
+  // The element, each line of it behind `indent`; nothing when there are none.
+  std::string xml(const std::string& indent) const;
+
+ private:
+  std::string elements_;
+};
+
+struct JUnitCounts {
+  std::size_t tests = 0;
+  std::size_t failures = 0;
+  std::size_t errors = 0;
+  std::size_t skipped = 0;
+  std::chrono::nanoseconds time{};
+
+  JUnitCounts& operator+=(const JUnitCounts& other);
+};
+
+// `<ELEMENT name="..." tests="..." ...>`: a suite's tag, or that of all suites.
+std::string junitTag(const std::string& element, const std::string& name, const JUnitCounts& counts, Date begin);
+
+class JUnitSuite {
+ public:
+  JUnitSuite(std::string name, Date begin, Date end);
+
+  JUnitProperties& properties() { return properties_; }
+
+  void addPass(const std::string& name, const JUnitProperties& properties);
+  void addFailure(const std::string& name, const JUnitProperties& properties, const std::string& message);
+  // With the errors that caused it, a line each.
+  void addError(const std::string& name, const JUnitProperties& properties, const DiagnosticErrorPtr& error);
+  void addSkipped(const std::string& name, const std::string& message);
+  void addLog(const std::vector<LogLine>& lines);
+
+  const JUnitCounts& counts() const { return counts_; }
+  std::string xml() const;
+
+ private:
+  // `outcome` is an element; empty for a pass.
+  void addCase(const std::string& name, const JUnitProperties& properties, const std::string& outcome);
+
+  std::string name_;
+  Date begin_;
+  JUnitCounts counts_;
+  JUnitProperties properties_;
+  std::string cases_;  // elements
+  std::string log_;    // lines, as XML
+};
+
+}  // namespace quazor

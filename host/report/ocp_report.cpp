@@ -1,0 +1,306 @@
+#include "host/report/ocp_report.h"
+
+#include "contract/message_format.h"
+#include "host/device/phone.h"
+#include "host/model/unfinished.h"
+#include "host/record/value_json.h"
+#include "host/report/ocp_stream.h"
+#include "host/report/text_report.h"
+
+#include <algorithm>
+#include <iterator>
+#include <string_view>
+#include <utility>
+
+namespace quazor {
+
+using Json = nlohmann::ordered_json;
+
+namespace {
+
+// The steps' identifiers, and the beginning of their names.
+constexpr const char* kExperimentStep = "experiment";
+constexpr const char* kAnalysisStep = "analysis";
+
+// The key of an empty text is left out: it has no value.
+void addText(Json& json, const char* key, const std::string& text) {
+  if (!text.empty()) json[key] = text;
+}
+
+// As a word of a shell's command.
+std::string quoted(const std::string& text) {
+  constexpr std::string_view kPlain = "ABCDEFGHIJKLMNOPQRSTUVWXYZabcdefghijklmnopqrstuvwxyz0123456789_./:=,+-";
+  if (!text.empty() && text.find_first_not_of(kPlain) == std::string::npos) return text;
+  std::string word = "'";
+  for (const char unit : text) {
+    if (unit == '\'') {
+      word += R"('\'')";
+    } else {
+      word += unit;
+    }
+  }
+  return word + "'";
+}
+
+// `before` is what stands between the line and the word, blanks too.
+void addWord(std::string& line, std::string_view before, const std::string& word) {
+  line += before;
+  line += quoted(word);
+}
+
+void addSettings(std::string& line, std::string_view half, const std::vector<BoundParameter>& parameters) {
+  for (const BoundParameter& one : parameters) {
+    if (one.value) addWord(line, " --set ", formatMessage("%@.%@=%@", half, one.name, *one.value));
+  }
+}
+
+// The command that runs them again, and nothing else.
+std::string commandOf(const RunBegan& run, const std::vector<std::string>& names, const BoundParameters& parameters) {
+  std::string line = run.ofExperiments ? "quazor experiment" : "quazor run";
+  for (const std::string& name : names) addWord(line, " ", name);
+  for (const std::string& plugin : run.plugins) addWord(line, " --plugin ", plugin);
+  if (!run.phone.empty()) addWord(line, " --phone ", run.phone);
+  if (!bindingNamed(run.phone)) line += " --seed " + std::to_string(run.seed);  // a real phone has none
+  line += " --profile none";
+  addSettings(line, "experiment", parameters.experiment);
+  addSettings(line, "analysis", parameters.analysis);
+  return line;
+}
+
+Json setParametersJson(const BoundParameters& parameters) {
+  Json json = Json::object();
+  if (!parameters.experiment.empty()) json["experiment"] = dictionaryJson(dictionaryOf(parameters.experiment));
+  if (!parameters.analysis.empty()) json["analysis"] = dictionaryJson(dictionaryOf(parameters.analysis));
+  return json;
+}
+
+Json startJson(const RunBegan& run, const std::string& name, std::string commandLine,
+               const BoundParameters& parameters = {}, Json metadata = Json::object()) {
+  Json dut = {{"dutInfoId", "phone"}};
+  addText(dut, "name", run.phone);
+  metadata["seed"] = run.seed;
+  metadata["contract"] = run.contract;
+  metadata["plugins"] = run.plugins;
+  return {{"name", name},
+          {"version", run.program},
+          {"commandLine", std::move(commandLine)},
+          {"parameters", setParametersJson(parameters)},
+          {"dutInfo", std::move(dut)},
+          {"metadata", std::move(metadata)}};
+}
+
+std::string symptomOf(const DiagnosticError& error) { return formatMessage("%@:%@", error.domain(), error.code()); }
+
+// The error and those that caused it, the nearest first; `add` takes one artifact.
+template <class Add>
+void addErrors(const DiagnosticErrorPtr& error, Add&& add) {
+  for (DiagnosticErrorPtr one = error; one != nullptr; one = one->underlyingError()) {
+    add(Json{{"symptom", symptomOf(*one)}, {"message", one->localizedDescription()}});
+  }
+}
+
+Json measurementJson(const std::string& name, const Measurement& measurement) {
+  Json json = {{"name", name}, {"value", numberJson(measurement.value())}};
+  addText(json, "unit", measurement.unit().symbol());
+  return json;
+}
+
+void addValidator(Json& validators, const QZLimit& limit, const std::shared_ptr<const QZBound>& bound,
+                  const char* closedType, const char* openType) {
+  if (bound == nullptr) return;
+  validators.push_back(
+      {{"name", limit.name()}, {"type", bound->open() ? openType : closedType}, {"value", bound->value().value()}});
+}
+
+void addBound(Json& limit, const char* key, const std::shared_ptr<const QZBound>& bound) {
+  if (bound == nullptr) return;
+  Json json = {{"value", numberJson(bound->value().value())}, {"open", bound->open()}};
+  addText(json, "unit", bound->value().unit().symbol());
+  limit[key] = std::move(json);
+}
+
+// Validators compare numbers and know no units. A limit that a result cannot be judged by, and one without a bound,
+// stand in the metadata.
+Json resultJson(const QZMeasuredResult& result) {
+  Json json = measurementJson(result.name(), result.measurement());
+  if (!result.limit()) return json;
+  const QZLimit& limit = *result.limit();
+  const ResultJudgement judgement = judgeResult(result);
+  if (judgement.verdict != ResultVerdict::kNone && judgement.problem.empty()) {
+    Json validators = Json::array();
+    addValidator(validators, limit, limit.lowerBound(), "GREATER_THAN_OR_EQUAL", "GREATER_THAN");
+    addValidator(validators, limit, limit.upperBound(), "LESS_THAN_OR_EQUAL", "LESS_THAN");
+    json["validators"] = std::move(validators);
+    return json;
+  }
+  Json unused = {{"name", limit.name()}};
+  addBound(unused, "lower", limit.lowerBound());
+  addBound(unused, "upper", limit.upperBound());
+  json["metadata"] = {{"limit", std::move(unused)}};
+  addText(json["metadata"], "problem", judgement.problem);
+  return json;
+}
+
+// With an error nobody knows what the hardware is like: a diagnosis FAIL would say so, and make the run fail.
+Json diagnosisJson(const JudgedResult& judged, bool known) {
+  const bool passed = judged.verdict == ResultVerdict::kPass;
+  const char* const type = !known ? "UNKNOWN" : passed ? "PASS" : "FAIL";
+  const char* const ending = !known ? "-unknown" : passed ? "-pass" : "-fail";
+  const QZMeasuredResult& result = judged.result;
+  return {{"verdict", result.name() + ending},
+          {"type", type},
+          {"message", formatMessage("%@ is %@ %@, and its limit %@", result.name(), result.measurement().value(),
+                                    result.measurement().unit().symbol(), limitText(result.limit()))}};
+}
+
+// Writes the test run of one record.
+class RecordWriter {
+ public:
+  RecordWriter(std::string& out, const RunBegan& run, const DiagnosticRecord& record)
+      : run_(run), record_(record), stream_(out, record.log, record.begin) {}
+
+  // Gives the date of the last line.
+  Date write() {
+    Json metadata = Json::object();
+    addText(metadata, "summary", record_.summary);
+    addText(metadata, "experiment", record_.experimentName);
+    addText(metadata, "analysis", record_.analysisName);
+    RunBegan ofRecord = run_;
+    ofRecord.seed = record_.seed;
+    ofRecord.ofExperiments = record_.experimentOnly;
+    std::string command = commandOf(ofRecord, {record_.name}, record_.parameters);
+    stream_.addToRun("testRunStart",
+                     startJson(ofRecord, record_.name, std::move(command), record_.parameters, std::move(metadata)),
+                     record_.begin);
+    writeExperiment();
+    writeAnalysis();
+    if (!errorIsWritten_) {
+      addErrors(record_.error, [this](Json error) { stream_.addToRun("error", std::move(error), record_.end); });
+    }
+    writeEnd();
+    return stream_.last();
+  }
+
+ private:
+  // The stages of a step that took place: by their beginning and end.
+  template <class IsOfStep>
+  std::vector<StagePeriod> stagesThat(IsOfStep&& isOfStep) const {
+    std::vector<StagePeriod> stages;
+    std::copy_if(record_.stages.begin(), record_.stages.end(), std::back_inserter(stages),
+                 [&isOfStep](const StagePeriod& one) { return isOfStep(one.stage); });
+    return stages;
+  }
+
+  void beginStep(const char* step, const std::string& name, const std::vector<StagePeriod>& stages) {
+    const Date begin = stages.empty() ? record_.begin : stages.front().begin;
+    stepEnd_ = stages.empty() ? record_.begin : stages.back().end.value_or(record_.end);
+    stream_.addToStep(step, "testStepStart", {{"name", name.empty() ? step : step + (" " + name)}}, begin);
+  }
+
+  void endStep(const char* step, bool hasError, bool failed) {
+    if (hasError) {
+      addErrors(record_.error,
+                [this, step](Json error) { stream_.addToStep(step, "error", std::move(error), stepEnd_); });
+      errorIsWritten_ = true;
+    }
+    stream_.addToStep(step, "testStepEnd", {{"status", hasError || failed ? "ERROR" : "COMPLETE"}}, stepEnd_);
+  }
+
+  static bool isOfExperiment(Stage stage) { return stage != Stage::kLoad && stage != Stage::kAnalyse; }
+  static bool isOfAnalysis(Stage stage) { return stage == Stage::kAnalyse; }
+
+  void writeExperiment() {
+    const std::vector<StagePeriod> stages = stagesThat(isOfExperiment);
+    if (stages.empty() && record_.measurements.empty() && record_.auxiliaryData.empty()) return;
+    beginStep(kExperimentStep, record_.experimentName, stages);
+    const auto run =
+        std::find_if(stages.begin(), stages.end(), [](const StagePeriod& one) { return one.stage == Stage::kRun; });
+    const Date measured = run == stages.end() ? stepEnd_ : run->end.value_or(stepEnd_);
+    for (const auto& [name, measurement] : record_.measurements) {
+      stream_.addToStep(kExperimentStep, "measurement", measurementJson("raw." + name, measurement), measured);
+    }
+    addExtension("auxiliaryData", dictionaryJson(record_.auxiliaryData), measured);
+    addExtension("faults", faultsJson(), stepEnd_);
+    if (record_.experimentOnly && record_.verdict == Verdict::kPass) {
+      stream_.addToStep(kExperimentStep, "diagnosis",
+                        {{"verdict", "not-judged"},
+                         {"type", "UNKNOWN"},
+                         {"message", "The experiment ran on its own: it returned a result, and nothing was judged."}},
+                        stepEnd_);
+    }
+    endStep(kExperimentStep, record_.errorStage && isOfExperiment(*record_.errorStage), false);
+  }
+
+  void addExtension(const char* name, Json content, Date date) {
+    if (content.empty()) return;
+    stream_.addToStep(kExperimentStep, "extension", {{"name", name}, {"content", std::move(content)}}, date);
+  }
+
+  Json faultsJson() const {
+    Json json = Json::object();
+    for (const DeclaredFault& fault : record_.faults) {
+      json["faults"].push_back({{"fault", fault.fault}, {"fired", fault.fired}});
+    }
+    return json;
+  }
+
+  void writeAnalysis() {
+    const std::vector<StagePeriod> stages = stagesThat(isOfAnalysis);
+    if (stages.empty() && record_.measuredResults.empty()) return;
+    beginStep(kAnalysisStep, record_.analysisName, stages);
+    const bool known = record_.verdict != Verdict::kError;
+    for (const JudgedResult& one : record_.measuredResults) {
+      stream_.addToStep(kAnalysisStep, "measurement", resultJson(one.result), stepEnd_);
+      if (one.verdict == ResultVerdict::kNone) continue;
+      stream_.addToStep(kAnalysisStep, "diagnosis", diagnosisJson(one, known), stepEnd_);
+    }
+    // The judge's error is this step's too. An analysis whose error came after another one has left no result.
+    const bool hasError = !known && !errorIsWritten_ && record_.errorStage.value_or(Stage::kAnalyse) == Stage::kAnalyse;
+    endStep(kAnalysisStep, hasError, !known && record_.measuredResults.empty());
+  }
+
+  void writeEnd() {
+    switch (record_.verdict) {
+      case Verdict::kPass: return stream_.end("COMPLETE", "PASS", record_.end);
+      case Verdict::kFail: return stream_.end("COMPLETE", "FAIL", record_.end);
+      case Verdict::kError: break;
+    }
+    stream_.end("ERROR", "NOT_APPLICABLE", record_.end);
+  }
+
+  const RunBegan& run_;
+  const DiagnosticRecord& record_;
+  OcpStream stream_;
+  Date stepEnd_{};
+  bool errorIsWritten_ = false;
+};
+
+}  // namespace
+
+std::string ocpReport(const RunBegan& run, const std::vector<DiagnosticRecord>& records,
+                      const std::optional<std::string>& interrupted) {
+  std::string report;
+  Date end = run.date;
+  for (const DiagnosticRecord& record : records) end = RecordWriter(report, run, record).write();
+  const Unfinished unfinished = unfinishedOf(run, records, interrupted);
+  const std::vector<LogLine> noLog;
+  if (unfinished.interrupted) {
+    const bool betweenTwo = unfinished.interrupted->empty();
+    const std::string name = betweenTwo ? "quazor" : *unfinished.interrupted;
+    OcpStream stream(report, noLog, end);
+    stream.addToRun("testRunStart",
+                    startJson(run, name, commandOf(run, betweenTwo ? run.names : std::vector{name}, {})), end);
+    addErrors(interruptionOf(*unfinished.interrupted),
+              [&stream, end](Json error) { stream.addToRun("error", std::move(error), end); });
+    stream.end("ERROR", "NOT_APPLICABLE", end);
+  }
+  for (const std::string& name : unfinished.neverRun) {
+    OcpStream stream(report, noLog, end);
+    stream.addToRun("testRunStart", startJson(run, name, commandOf(run, {name}, {})), end);
+    stream.addToRun("log", {{"severity", "INFO"}, {"message", "The run ended before this was run."}}, end);
+    stream.end("SKIP", "NOT_APPLICABLE", end);
+  }
+  return report;
+}
+
+}  // namespace quazor

@@ -1,0 +1,89 @@
+#include "host/report/progress.h"
+
+#include "contract/message_format.h"
+#include "host/text/table.h"
+
+#include <cmath>
+#include <utility>
+
+namespace quazor {
+
+namespace {
+
+using namespace std::chrono_literals;
+using SteadyClock = std::chrono::steady_clock;
+
+constexpr std::chrono::milliseconds kQuietTime = 300ms;
+constexpr std::chrono::milliseconds kPeriod = 100ms;
+
+// With at most one digit after the point.
+std::string secondsText(double seconds) { return defaultText(std::round(seconds * 10) / 10) + " s"; }
+
+}  // namespace
+
+ExpectedProgress expectedProgressOf(const BoundParameters& parameters) {
+  const auto above0 = [&parameters](std::string_view wanted) -> const Value* {
+    for (const BoundParameter& one : parameters.experiment) {
+      if (one.name == wanted && one.value && toDouble(&*one.value) > 0) return &*one.value;
+    }
+    return nullptr;
+  };
+  ExpectedProgress expected;
+  const Value* const duration = above0("duration");
+  const Value* const seconds = duration != nullptr ? duration : above0("timeout");
+  if (seconds != nullptr) expected.seconds = toDouble(seconds);
+  const std::uint64_t frames = toUnsigned(above0("frameCount"));
+  if (frames > 0) expected.frames = frames;
+  return expected;
+}
+
+std::string progressText(const std::string& name, double elapsedSeconds, const ExpectedProgress& expected,
+                         std::optional<std::uint64_t> frames) {
+  std::string text = "Running " + printable(name) + ": " + secondsText(elapsedSeconds);
+  if (expected.seconds) text += " of " + secondsText(*expected.seconds);
+  if (expected.frames && frames) text += formatMessage(", %@ of %@ frames", *frames, *expected.frames);
+  return text;
+}
+
+void Progress::start(const std::string& name, const ExpectedProgress& expected) {
+  running_ = true;
+  name_ = name;
+  expected_ = expected;
+  begin_ = SteadyClock::now();
+  nextUpdate_ = begin_ + kQuietTime;
+}
+
+void Progress::countFrames(std::function<std::uint64_t()> count) {
+  if (running_) frames_ = std::move(count);
+}
+
+void Progress::update() {
+  if (!running_ || terminal_ == nullptr) return;
+  const SteadyClock::time_point now = SteadyClock::now();
+  if (now < nextUpdate_) return;
+  nextUpdate_ = now + kPeriod;
+  const double elapsed = std::chrono::duration<double>(now - begin_).count();
+  const std::optional<std::uint64_t> frames = frames_ ? std::optional(frames_()) : std::nullopt;
+  erase();
+  *terminal_ << progressText(name_, elapsed, expected_, frames) << std::flush;
+  lineIsThere_ = true;
+}
+
+void Progress::stop() {
+  running_ = false;
+  frames_ = nullptr;
+  erase();
+}
+
+void Progress::aside(const std::function<void()>& write) {
+  erase();
+  write();
+}
+
+void Progress::erase() {
+  if (!lineIsThere_) return;
+  *terminal_ << "\r\033[K" << std::flush;
+  lineIsThere_ = false;
+}
+
+}  // namespace quazor

@@ -1,0 +1,108 @@
+#include "host/report/record_difference.h"
+
+#include "host/testing/test_events.h"
+#include "host/testing/test_records.h"
+
+#include <gmock/gmock.h>
+#include <gtest/gtest.h>
+
+#include <functional>
+
+namespace quazor {
+namespace {
+
+using namespace std::chrono_literals;
+using testing::ElementsAre;
+using testing::IsEmpty;
+
+RecordedRun runWith(std::vector<DiagnosticRecord> records) { return {runOf({}), std::move(records), std::nullopt}; }
+
+std::vector<std::string> differences(const std::function<void(DiagnosticRecord&)>& change,
+                                     Verdict verdict = Verdict::kPass) {
+  DiagnosticRecord changed = recordOf("A", verdict);
+  change(changed);
+  return differencesOf(runWith({recordOf("A", verdict)}), runWith({changed}));
+}
+
+TEST(DifferencesOf, AreNoneOfEqualRuns) {
+  const RecordedRun run = runWith({recordOf("A", Verdict::kPass), recordOf("B", Verdict::kError)});
+  EXPECT_THAT(differencesOf(run, run), IsEmpty());
+  EXPECT_THAT(differencesOf(runWith({}), runWith({})), IsEmpty());
+}
+
+TEST(DifferencesOf, LeaveOutTimesAndLogs) {
+  EXPECT_THAT(differences([](DiagnosticRecord& record) {
+                record.begin = momentAt(1);
+                record.end = momentAt(2);
+                record.durations.run = 5s;
+                record.log.clear();
+                record.stages.push_back({Stage::kRun, momentAt(1), momentAt(2)});
+                record.parameters.experiment[0].source = "environment";
+              }),
+              IsEmpty());
+}
+
+TEST(DifferencesOf, TellWhatWasAndWhatIs) {
+  struct Row {
+    const char* name;
+    std::function<void(DiagnosticRecord&)> change;
+    std::vector<std::string> differences;
+  };
+  const Row rows[] = {
+      {"a verdict", [](DiagnosticRecord& r) { r.verdict = Verdict::kFail; }, {"A: verdict was pass and is fail"}},
+      {"an error",
+       [](DiagnosticRecord& r) {
+         r.error = errorWithMessage("D", 1, "two\nlines", errorWithMessage("E", 2, "cause", nullptr));
+       },
+       {"A: error was none and is D code 1: two\\x0alines caused by E code 2: cause"}},
+      {"a parameter's value",
+       [](DiagnosticRecord& r) { r.parameters.experiment[0].value = Value(4); },
+       {"A: parameter experiment.duration was 3 and is 4"}},
+      {"a parameter that was not set",
+       [](DiagnosticRecord& r) { r.parameters.experiment[1].value = Value(0.5); },
+       {"A: parameter experiment.gain was not set and is 0.5"}},
+      {"a new parameter",
+       [](DiagnosticRecord& r) {
+         r.parameters.analysis.push_back({"x", QZNumberParameter("", false), Value(1), "command line"});
+       },
+       {"A: parameter analysis.x is only in the second: 1"}},
+      {"a measurement",
+       [](DiagnosticRecord& r) { r.measurements.set("Raw", Measurement(91, QZDimensionlessUnit::frames())); },
+       {"A: measurement Raw was 90 frames and is 91 frames"}},
+      {"a measurement's unit",
+       [](DiagnosticRecord& r) { r.measurements.set("Raw", Measurement(90, QZDimensionlessUnit::errors())); },
+       {"A: measurement Raw was 90 frames and is 90 errors"}},
+      {"a result's value",
+       [](DiagnosticRecord& r) { r.measuredResults[0].result = resultWithMinimum(91, 90); },
+       {"A: result Count was 90 frames, Enough: >= 90, pass and is 91 frames, Enough: >= 90, pass"}},
+      {"a limit",
+       [](DiagnosticRecord& r) { r.measuredResults[0].result = resultWithMinimum(90, 80); },
+       {"A: result Count was 90 frames, Enough: >= 90, pass and is 90 frames, Enough: >= 80, pass"}},
+      {"a result's verdict",
+       [](DiagnosticRecord& r) { r.measuredResults[0].verdict = ResultVerdict::kFail; },
+       {"A: result Count was 90 frames, Enough: >= 90, pass and is 90 frames, Enough: >= 90, fail"}},
+      {"a result that is missing",
+       [](DiagnosticRecord& r) { r.measuredResults.pop_back(); },
+       {"A: result Offset is only in the first: 0.5 events, -, none"}},
+      {"a second result of one name",
+       [](DiagnosticRecord& r) {
+         r.measuredResults.push_back({resultWithMinimum(91, 90), ResultVerdict::kPass});
+       },
+       {"A: result Count (2) is only in the second: 91 frames, Enough: >= 90, pass"}},
+      {"auxiliary data",
+       [](DiagnosticRecord& r) { r.auxiliaryData.set("bytes", Bytes{1}); },
+       {"A: auxiliary data bytes was a5 and is 01"}},
+  };
+  for (const Row& row : rows) EXPECT_EQ(differences(row.change), row.differences) << row.name;
+}
+
+TEST(DifferencesOf, TellWhichDiagnosticsOnlyOneRunHas) {
+  const DiagnosticRecord a = recordOf("A", Verdict::kPass);
+  const DiagnosticRecord b = recordOf("B", Verdict::kPass);
+  const DiagnosticRecord c = recordOf("C", Verdict::kPass);
+  EXPECT_THAT(differencesOf(runWith({a, b}), runWith({c, b})),
+              ElementsAre("A is only in the first", "C is only in the second"));
+}
+
+}  // namespace
+}  // namespace quazor

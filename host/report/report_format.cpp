@@ -1,0 +1,87 @@
+#include "host/report/report_format.h"
+
+#include "base/text/nearest_name.h"
+#include "host/error/exit_code.h"
+#include "host/record/value_json.h"
+#include "host/report/csv_report.h"
+#include "host/report/experiment_report.h"
+#include "host/report/json_report.h"
+#include "host/report/junit_report.h"
+#include "host/report/ocp_report.h"
+#include "host/report/text_report.h"
+#include "host/text/table.h"
+
+#include <sstream>
+
+namespace quazor {
+
+namespace {
+
+std::string textReport(const RunBegan& run, const std::vector<DiagnosticRecord>& records,
+                       const std::optional<std::string>& interrupted) {
+  std::ostringstream text;
+  for (const DiagnosticRecord& record : records) printReport(text, record, false, false);
+  if (records.size() != 1 || interrupted) printCounts(text, records, run.ofExperiments);
+  if (interrupted && !interrupted->empty()) {
+    text << "Interrupted while " << printable(*interrupted) << " was running.\n";
+  }
+  return text.str();
+}
+
+}  // namespace
+
+std::string_view nameOf(Format format) {
+  switch (format) {
+    case Format::kText: return "text";
+    case Format::kJson: return "json";
+    case Format::kCsv: return "csv";
+    case Format::kOcp: return "ocp";
+    case Format::kJunit: break;
+  }
+  return "junit";
+}
+
+std::optional<Format> formatNamed(std::string_view name) {
+  for (const Format format : kFormats) {
+    if (nameOf(format) == name) return format;
+  }
+  return std::nullopt;
+}
+
+OutputRequest parseOutput(const std::string& text, Format usual) {
+  const std::size_t colon = text.find(':');
+  const std::string word = text.substr(0, colon);
+  const bool isWord = !word.empty() && word.find_first_not_of("abcdefghijklmnopqrstuvwxyz") == std::string::npos;
+  if (colon == std::string::npos || !isWord) return {usual, text};
+  if (const std::optional<Format> format = formatNamed(word)) return {*format, text.substr(colon + 1)};
+  std::vector<std::string> names;
+  for (const Format format : kFormats) names.emplace_back(nameOf(format));
+  throw Refusal(ExitCode::kUsage, "--output '" + text + "': there is no format '" + word +
+                                      "' (a file of this name is './" + text + "')" + didYouMean(word, names));
+}
+
+std::string reportText(Format format, const RunBegan& run, const std::vector<DiagnosticRecord>& records,
+                       const std::optional<std::string>& interrupted) {
+  switch (format) {
+    case Format::kText: return textReport(run, records, interrupted);
+    case Format::kCsv: return run.ofExperiments ? experimentCsv(records) : diagnosticCsv(records);
+    case Format::kOcp: return ocpReport(run, records, interrupted);
+    case Format::kJunit: return junitReport(run, records, interrupted);
+    case Format::kJson: break;
+  }
+  return documentText(run.ofExperiments ? experimentDocument(records, interrupted) : runDocument(records, interrupted));
+}
+
+void printReport(std::ostream& out, const DiagnosticRecord& record, bool colour, bool blocks) {
+  if (record.experimentOnly) {
+    printExperiment(out, record, {colour, blocks});
+  } else {
+    printRecord(out, record, colour);
+  }
+}
+
+void printCounts(std::ostream& out, const std::vector<DiagnosticRecord>& records, bool ofExperiments) {
+  ofExperiments ? printExperimentSummary(out, records) : printSummary(out, records);
+}
+
+}  // namespace quazor

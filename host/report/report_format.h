@@ -1,0 +1,42 @@
+// The forms of reports.
+#pragma once
+
+#include "host/model/run_event.h"
+
+#include <filesystem>
+#include <optional>
+#include <string>
+#include <string_view>
+#include <vector>
+
+namespace quazor {
+
+enum class Format { kText, kJson, kCsv, kOcp, kJunit };
+
+inline constexpr Format kFormats[] = {Format::kText, Format::kJson, Format::kCsv, Format::kOcp, Format::kJunit};
+
+std::string_view nameOf(Format format);  // "text", "json", "csv", "ocp", "junit"
+
+// The format of that name.
+std::optional<Format> formatNamed(std::string_view name);
+
+// A report that was asked for.
+struct OutputRequest {
+  Format format = Format::kText;
+  std::filesystem::path file;
+};
+
+// [FORMAT:]FILE; without a format it is `usual`. Throws a Refusal (kUsage) for a word before a colon that is no format.
+OutputRequest parseOutput(const std::string& text, Format usual);
+
+// The whole report of a run. `interrupted` is that of RunEnded.
+std::string reportText(Format format, const RunBegan& run, const std::vector<DiagnosticRecord>& records,
+                       const std::optional<std::string>& interrupted);
+
+// One record in the form for people.
+void printReport(std::ostream& out, const DiagnosticRecord& record, bool colour, bool blocks);
+
+// How many there were of each verdict, in one line.
+void printCounts(std::ostream& out, const std::vector<DiagnosticRecord>& records, bool ofExperiments);
+
+}  // namespace quazor

@@ -1,0 +1,104 @@
+#include "host/report/report_format.h"
+
+#include "host/error/exit_code.h"
+
+#include "host/record/value_json.h"
+#include "host/report/json_report.h"
+#include "host/testing/test_events.h"
+#include "host/testing/test_records.h"
+
+#include <gmock/gmock.h>
+#include <gtest/gtest.h>
+#include <nlohmann/json.hpp>
+
+namespace quazor {
+namespace {
+
+using testing::EndsWith;
+using testing::HasSubstr;
+using testing::Not;
+using testing::StartsWith;
+
+TEST(Formats, HaveNamesByWhichTheyAreFound) {
+  constexpr std::string_view kNames[] = {"text", "json", "csv", "ocp", "junit"};
+  for (std::size_t i = 0; i < std::size(kFormats); ++i) {
+    EXPECT_EQ(nameOf(kFormats[i]), kNames[i]);
+    EXPECT_EQ(formatNamed(kNames[i]), kFormats[i]);
+  }
+  for (const char* name : {"", "xml", "JSON", "json "}) EXPECT_EQ(formatNamed(name), std::nullopt) << name;
+}
+
+TEST(ParseOutput, RefusesAWordBeforeAColonThatIsNoFormat) {
+  try {
+    parseOutput("jnuit:report", Format::kText);
+    FAIL() << "it was taken";
+  } catch (const Refusal& refusal) {
+    EXPECT_EQ(refusal.code(), ExitCode::kUsage);
+    EXPECT_STREQ(refusal.what(),
+                 "--output 'jnuit:report': there is no format 'jnuit' (a file of this name is "
+                 "'./jnuit:report'); did you mean 'junit'?");
+  }
+}
+
+TEST(ParseOutput, TakesAFormatBeforeAColon) {
+  struct Row {
+    const char* text;
+    Format format;
+    const char* file;
+  };
+  constexpr Row kRows[] = {
+      {"report", Format::kCsv, "report"},
+      {"junit:report.xml", Format::kJunit, "report.xml"},
+      {"text:a:b", Format::kText, "a:b"},
+      {"./xml:report", Format::kCsv, "./xml:report"},
+      {"C3:report", Format::kCsv, "C3:report"},
+      {"json", Format::kCsv, "json"},
+      {"json:", Format::kJson, ""},
+      {"./json:report", Format::kCsv, "./json:report"},
+      {":report", Format::kCsv, ":report"},
+  };
+  for (const Row& row : kRows) {
+    const OutputRequest request = parseOutput(row.text, Format::kCsv);
+    EXPECT_EQ(request.format, row.format) << row.text;
+    EXPECT_EQ(request.file, row.file) << row.text;
+  }
+}
+
+class ReportTextTest : public testing::Test {
+ protected:
+  std::string report(Format format, const std::optional<std::string>& interrupted = std::nullopt) const {
+    return reportText(format, run_, records_, interrupted);
+  }
+
+  RunBegan run_ = runOf({"A", "B"});
+  std::vector<DiagnosticRecord> records_ = {recordOf("A", Verdict::kPass), recordOf("B", Verdict::kFail)};
+};
+
+TEST_F(ReportTextTest, HasEachRecordInEveryFormat) {
+  EXPECT_THAT(report(Format::kText),
+              testing::AllOf(HasSubstr("  PASS\n"), HasSubstr("  FAIL\n"),
+                             EndsWith("2 diagnostics: 1 passed, 1 failed, 0 ended in an error\n")));
+  EXPECT_EQ(report(Format::kJson), documentText(runDocument(records_, std::nullopt)));
+  EXPECT_THAT(report(Format::kCsv), testing::AllOf(StartsWith("diagnostic,verdict,"), HasSubstr("\nB,fail,")));
+  EXPECT_THAT(report(Format::kJunit), testing::AllOf(StartsWith("<?xml"), HasSubstr("<testsuite name=\"B\"")));
+  EXPECT_THAT(report(Format::kOcp), StartsWith("{\"schemaVersion\":"));
+}
+
+TEST_F(ReportTextTest, HasADocumentAndATableOfItsOwnForExperiments) {
+  run_.ofExperiments = true;
+  for (DiagnosticRecord& record : records_) record.experimentOnly = true;
+  EXPECT_EQ(report(Format::kJson), documentText(experimentDocument(records_, std::nullopt)));
+  EXPECT_THAT(report(Format::kCsv), StartsWith("experiment,measurement,"));
+  EXPECT_THAT(report(Format::kText), testing::AllOf(HasSubstr("  DONE\n"), HasSubstr("2 experiments: ")));
+}
+
+TEST_F(ReportTextTest, CountsOneRecordOnlyWhenTheRunWasInterrupted) {
+  records_.pop_back();
+  EXPECT_THAT(report(Format::kText), Not(HasSubstr("1 diagnostic")));
+  EXPECT_THAT(report(Format::kText, ""), EndsWith("1 diagnostic: 1 passed, 0 failed, 0 ended in an error\n"));
+  EXPECT_THAT(report(Format::kText, "B\n"), EndsWith("an error\nInterrupted while B\\x0a was running.\n"));
+  EXPECT_EQ(nlohmann::json::parse(report(Format::kJson, "B"))["interrupted"], "B");
+}
+
+}  // namespace
+}  // namespace quazor

@@ -1,0 +1,97 @@
+#include "host/report/run_report.h"
+
+#include "backends/threads/standard_error_log.h"
+#include "host/report/text_report.h"
+#include "host/system/output_file.h"
+#include "host/text/table.h"
+
+#include <utility>
+
+namespace quazor {
+
+RunReport::RunReport(ReportOptions options, Console& console)
+    : options_(std::move(options)), console_(console), progress_(console.showsProgress ? &console.err : nullptr) {}
+
+void RunReport::take(const RunEvent& event) {
+  builder_.take(event);
+  if (const auto* const began = std::get_if<RunBegan>(&event)) {
+    run_ = *began;
+  } else if (const auto* const diagnostic = std::get_if<DiagnosticBegan>(&event)) {
+    progress_.start(diagnostic->name, expectedProgressOf(diagnostic->parameters));
+  } else if (const auto* const logged = std::get_if<Logged>(&event)) {
+    const LogLine& line = logged->line;
+    if (line.level > options_.shownLog) return;
+    progress_.aside([&] {
+      console_.err << readableLogLine(line.date, line.level, sharedLog().category(), printableLines(line.text))
+                   << std::flush;
+    });
+  } else if (std::holds_alternative<DiagnosticEnded>(event)) {
+    finishDiagnostic();
+  } else if (const auto* const ended = std::get_if<RunEnded>(&event)) {
+    finishRun(*ended);
+  }
+}
+
+void RunReport::finishDiagnostic() {
+  progress_.stop();
+  DiagnosticRecord record = builder_.takeRecord();
+  if (!options_.output.empty()) {
+    printVerdict(console_.out, record, console_.colour);
+  } else if (options_.format == Format::kText) {
+    printReport(console_.out, record, console_.colour, console_.blocks);
+  }
+  console_.out.flush();
+  // A table of measurements has no place for errors.
+  if (options_.format == Format::kCsv && run_.ofExperiments && record.error != nullptr) {
+    console_.err << "quazor: " << printable(record.name) << " ended in an error\n" << errorText(record.error, "  ");
+  }
+  printUnfiredFaults(console_.err, record);
+  records_.push_back(std::move(record));
+}
+
+void RunReport::finishRun(const RunEnded& event) {
+  progress_.stop();
+  const bool toFile = !options_.output.empty();
+  const std::optional<std::string>& interrupted = event.interrupted;
+  if ((toFile || options_.format == Format::kText) && (records_.size() != 1 || interrupted)) {
+    printCounts(console_.out, records_, run_.ofExperiments);
+  }
+  if (!toFile && options_.format != Format::kText) {
+    console_.out << reportText(options_.format, run_, records_, interrupted);
+  }
+  console_.out.flush();
+  if (interrupted && interrupted->empty()) {
+    console_.err << "quazor: interrupted between two " << (run_.ofExperiments ? "experiments" : "diagnostics") << '\n';
+  }
+  if (interrupted && !interrupted->empty()) {
+    console_.err << "quazor: interrupted while " << printable(*interrupted) << " was running\n";
+  }
+  if (!console_.out) {
+    console_.err << "quazor: the standard output cannot be written\n";
+    allWritten_ = false;
+  }
+  if (toFile) writeFile({options_.format, options_.output}, interrupted);
+  for (const OutputRequest& output : options_.outputs) writeFile(output, interrupted);
+  console_.err.flush();
+}
+
+void RunReport::writeFile(const OutputRequest& output, const std::optional<std::string>& interrupted) {
+  const std::string why = writeOutputFile(output.file, reportText(output.format, run_, records_, interrupted));
+  if (why.empty()) return;
+  console_.err << "quazor: the output file '" << printable(output.file.string()) << "' cannot be written: " << why
+               << '\n';
+  allWritten_ = false;
+}
+
+ExitCode RunReport::exitCode() const { return allWritten_ ? exitCodeOf(records_) : ExitCode::kCannotWrite; }
+
+ExitCode exitCodeOf(const std::vector<DiagnosticRecord>& records) {
+  ExitCode code = ExitCode::kAllPassed;
+  for (const DiagnosticRecord& record : records) {
+    if (record.verdict == Verdict::kError) return ExitCode::kError;
+    if (record.verdict == Verdict::kFail) code = ExitCode::kFailed;
+  }
+  return code;
+}
+
+}  // namespace quazor

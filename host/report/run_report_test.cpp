@@ -1,0 +1,318 @@
+#include "host/report/run_report.h"
+
+#include "host/testing/test_directory.h"
+#include "host/testing/test_events.h"
+#include "host/testing/test_records.h"
+
+#include <gmock/gmock.h>
+#include <gtest/gtest.h>
+#include <nlohmann/json.hpp>
+
+#include <sstream>
+
+namespace quazor {
+namespace {
+
+using testing::EndsWith;
+using testing::HasSubstr;
+using testing::Not;
+using Json = nlohmann::ordered_json;
+
+// The events of a diagnostic whose record is this one.
+std::vector<RunEvent> eventsOf(const DiagnosticRecord& record) {
+  DiagnosticBegan began = beginningOf(record.name);
+  began.experimentOnly = record.experimentOnly;
+  began.parameters = record.parameters;
+  Found found;
+  for (const JudgedResult& one : record.measuredResults) found.results.push_back(one.result);
+  Measured measured;
+  for (const auto& one : record.measurements) measured.measurements.push_back(one);
+  std::vector<RunEvent> events = {began, measured, found};
+  for (const auto& [key, value] : record.auxiliaryData) events.emplace_back(Collected{key, value});
+  for (const LogLine& line : record.log) events.emplace_back(Logged{line});
+  if (record.error != nullptr) events.emplace_back(Failed{Stage::kRun, record.error});
+  events.emplace_back(FaultsCounted{record.faults});
+  events.emplace_back(DiagnosticEnded{record.verdict, momentAt(9)});
+  return events;
+}
+
+class RunReportTest : public testing::Test {
+ protected:
+  static void takeAll(RunReport& report, const std::vector<RunEvent>& events) {
+    for (const RunEvent& event : events) report.take(event);
+  }
+
+  // The record of a diagnostic, or of an experiment, of that verdict, without log lines.
+  DiagnosticRecord quietRecord(const std::string& name, Verdict verdict) const {
+    DiagnosticRecord record = recordOf(name, verdict);
+    record.log.clear();
+    record.experimentOnly = ofExperiments_;
+    if (ofExperiments_) {
+      record.measuredResults.clear();
+      record.auxiliaryData.set("samples", Array{0, 1, 2, 3, 4, 5, 6, 7});
+    }
+    return record;
+  }
+
+  // Runs diagnostics with these verdicts, named A, B and so on.
+  void run(RunReport& report, const std::vector<Verdict>& verdicts) const {
+    RunBegan began = runOf({});
+    began.ofExperiments = ofExperiments_;
+    report.take(began);
+    std::string name = "A";
+    for (const Verdict verdict : verdicts) {
+      takeAll(report, eventsOf(quietRecord(name, verdict)));
+      ++name[0];
+    }
+  }
+
+  static ExitCode end(RunReport& report, const std::optional<std::string>& interrupted = std::nullopt) {
+    report.take(RunEnded{interrupted, momentAt(99)});
+    return report.exitCode();
+  }
+
+  bool ofExperiments_ = false;
+  TestDirectory directory_;
+  std::ostringstream out_;
+  std::ostringstream err_;
+  Console console_{out_, err_};
+};
+
+TEST_F(RunReportTest, PrintsEachRecordAsItIsFinished) {
+  RunReport report({}, console_);
+  run(report, {Verdict::kPass});
+  EXPECT_THAT(out_.str(), HasSubstr("PASS"));
+}
+
+TEST_F(RunReportTest, SummarizesSeveralDiagnosticsButNotOne) {
+  RunReport one({}, console_);
+  run(one, {Verdict::kPass});
+  EXPECT_EQ(end(one), ExitCode::kAllPassed);
+  EXPECT_THAT(out_.str(), Not(HasSubstr("1 diagnostic")));
+  RunReport two({}, console_);
+  run(two, {Verdict::kPass, Verdict::kFail});
+  EXPECT_EQ(end(two), ExitCode::kFailed);
+  EXPECT_THAT(out_.str(), EndsWith("2 diagnostics: 1 passed, 1 failed, 0 ended in an error\n"));
+}
+
+TEST_F(RunReportTest, PrintsOneJsonDocumentAndNothingElse) {
+  RunReport report({Format::kJson, {}}, console_);
+  run(report, {Verdict::kPass, Verdict::kError});
+  EXPECT_EQ(out_.str(), "");
+  EXPECT_EQ(end(report), ExitCode::kError);
+  EXPECT_EQ(Json::parse(out_.str())["diagnostics"].size(), 2U);
+}
+
+TEST_F(RunReportTest, WritesTheOutputFileAndPrintsTheVerdicts) {
+  for (const Format format : {Format::kText, Format::kJson}) {
+    out_.str("");
+    RunReport report({format, directory_.path() / "out"}, console_);
+    run(report, {Verdict::kPass, Verdict::kFail});
+    EXPECT_FALSE(std::filesystem::exists(directory_.path() / "out"));
+    EXPECT_EQ(end(report), ExitCode::kFailed);
+    EXPECT_EQ(out_.str(), "PASS  A\nFAIL  B\n2 diagnostics: 1 passed, 1 failed, 0 ended in an error\n");
+    const std::string written = directory_.read("out");
+    if (format == Format::kJson) {
+      EXPECT_EQ(Json::parse(written)["diagnostics"].size(), 2U);
+    } else {
+      EXPECT_THAT(written, testing::AllOf(HasSubstr("Count      90  frames  Enough: >= 90  pass"), HasSubstr("FAIL")));
+    }
+    std::filesystem::remove(directory_.path() / "out");
+  }
+}
+
+TEST_F(RunReportTest, TellsWhenTheOutputFileCannotBeWrittenAndStillPrintsTheVerdicts) {
+  const std::filesystem::path file = directory_.path() / "nowhere" / "out";
+  RunReport report({Format::kJson, file}, console_);
+  run(report, {Verdict::kFail});
+  EXPECT_EQ(end(report), ExitCode::kCannotWrite);
+  EXPECT_EQ(out_.str(), "FAIL  A\n");
+  EXPECT_EQ(err_.str(),
+            "quazor: the output file '" + file.string() + "' cannot be written: No such file or directory\n");
+}
+
+TEST_F(RunReportTest, TellsWhenTheStandardOutputCannotBeWritten) {
+  RunReport report({}, console_);
+  run(report, {Verdict::kPass});
+  out_.setstate(std::ios::badbit);
+  EXPECT_EQ(end(report), ExitCode::kCannotWrite);
+  EXPECT_EQ(err_.str(), "quazor: the standard output cannot be written\n");
+}
+
+class ExperimentReportTest : public RunReportTest {
+ protected:
+  ExperimentReportTest() { ofExperiments_ = true; }
+};
+
+TEST_F(ExperimentReportTest, PrintsEachExperimentAndHowManyThereWere) {
+  RunReport report({}, console_);
+  run(report, {Verdict::kPass, Verdict::kError});
+  EXPECT_THAT(out_.str(), testing::AllOf(HasSubstr("  DONE\n"), HasSubstr("  ERROR\n"), HasSubstr("\n  .:::::::\n")));
+  EXPECT_EQ(end(report), ExitCode::kError);
+  EXPECT_THAT(out_.str(), EndsWith("2 experiments: 1 returned a result, 1 ended in an error\n"));
+}
+
+TEST_F(ExperimentReportTest, DrawsBlocksWhereTheConsoleTakesThem) {
+  console_.blocks = true;
+  RunReport report({}, console_);
+  run(report, {Verdict::kPass});
+  EXPECT_EQ(end(report), ExitCode::kAllPassed);
+  EXPECT_THAT(out_.str(), HasSubstr("\u2588"));
+}
+
+TEST_F(ExperimentReportTest, WritesTheDocumentOfExperiments) {
+  RunReport report({Format::kJson, {}}, console_);
+  run(report, {Verdict::kPass});
+  EXPECT_EQ(end(report), ExitCode::kAllPassed);
+  EXPECT_EQ(Json::parse(out_.str())["experiments"].size(), 1U);
+}
+
+TEST_F(ExperimentReportTest, WritesOneTableAndTellsErrorsBesideIt) {
+  RunReport report({Format::kCsv, {}}, console_);
+  run(report, {Verdict::kPass, Verdict::kError});
+  EXPECT_EQ(out_.str(), "");
+  EXPECT_EQ(end(report), ExitCode::kError);
+  EXPECT_EQ(out_.str(), "experiment,measurement,value,unit\nA,Raw,90,frames\nB,Raw,90,frames\n");
+  EXPECT_EQ(err_.str(),
+            "quazor: B ended in an error\n  Domain code -1: it failed\n  caused by Deep code 2: the cause\n");
+}
+
+TEST_F(ExperimentReportTest, WritesTheTableToAFile) {
+  RunReport report({Format::kCsv, directory_.path() / "out"}, console_);
+  run(report, {Verdict::kPass});
+  EXPECT_EQ(end(report), ExitCode::kAllPassed);
+  EXPECT_EQ(directory_.read("out"), "experiment,measurement,value,unit\nA,Raw,90,frames\n");
+  EXPECT_EQ(out_.str(), "DONE  A\n");
+}
+
+TEST_F(ExperimentReportTest, SpeaksOfExperimentsWhenInterruptedBetweenTwo) {
+  RunReport report({Format::kCsv, {}}, console_);
+  run(report, {Verdict::kPass});
+  end(report, "");
+  EXPECT_EQ(err_.str(), "quazor: interrupted between two experiments\n");
+  EXPECT_THAT(out_.str(), HasSubstr("A,Raw,90,frames\n"));
+}
+
+TEST_F(RunReportTest, PointsOutUnfiredFaults) {
+  RunReport report({}, console_);
+  DiagnosticRecord record = quietRecord("A", Verdict::kPass);
+  record.faults[0].fired = 0;
+  takeAll(report, eventsOf(record));
+  EXPECT_THAT(err_.str(), HasSubstr("A: a fault of the phone never fired"));
+}
+
+TEST_F(RunReportTest, WritesWhatIsFinishedWhenInterrupted) {
+  RunReport report({Format::kJson, {}}, console_);
+  run(report, {Verdict::kPass, Verdict::kError});
+  EXPECT_EQ(end(report, "B"), ExitCode::kError);
+  const Json document = Json::parse(out_.str());
+  EXPECT_EQ(document["diagnostics"].size(), 2U);
+  EXPECT_EQ(document["interrupted"], "B");
+  EXPECT_EQ(err_.str(), "quazor: interrupted while B was running\n");
+}
+
+TEST_F(RunReportTest, WritesTheOutputFileWhenInterrupted) {
+  RunReport report({Format::kText, directory_.path() / "out"}, console_);
+  run(report, {Verdict::kPass});
+  end(report, "Slow");
+  EXPECT_THAT(directory_.read("out"), EndsWith("1 diagnostic: 1 passed, 0 failed, 0 ended in an error\n"
+                                               "Interrupted while Slow was running.\n"));
+}
+
+TEST_F(RunReportTest, SaysSoWhenInterruptedBetweenTwoDiagnostics) {
+  RunReport report({Format::kJson, {}}, console_);
+  run(report, {Verdict::kPass});
+  end(report, "");
+  EXPECT_EQ(Json::parse(out_.str())["interrupted"], "");
+  EXPECT_EQ(err_.str(), "quazor: interrupted between two diagnostics\n");
+}
+
+TEST_F(RunReportTest, WritesFurtherReportsInTheirFormats) {
+  ReportOptions options;
+  for (const Format format : kFormats) {
+    options.outputs.push_back({format, directory_.path() / std::string(nameOf(format))});
+  }
+  RunReport report(options, console_);
+  run(report, {Verdict::kPass});
+  EXPECT_FALSE(std::filesystem::exists(directory_.path() / "text"));
+  EXPECT_EQ(end(report), ExitCode::kAllPassed);
+  EXPECT_THAT(out_.str(), HasSubstr("  PASS\n"));
+  EXPECT_EQ(directory_.read("text"), out_.str());
+  EXPECT_EQ(Json::parse(directory_.read("json"))["diagnostics"].size(), 1U);
+  EXPECT_THAT(directory_.read("csv"), testing::StartsWith("diagnostic,verdict,result,"));
+  EXPECT_THAT(directory_.read("junit"), testing::StartsWith("<?xml"));
+  EXPECT_THAT(directory_.read("ocp"), testing::StartsWith("{\"schemaVersion\""));
+}
+
+TEST_F(RunReportTest, WritesTheOtherReportsWhenOneCannotBeWritten) {
+  ReportOptions options;
+  options.outputs = {{Format::kJson, directory_.path() / "nowhere" / "a"}, {Format::kJson, directory_.path() / "b"}};
+  RunReport report(options, console_);
+  run(report, {Verdict::kPass});
+  EXPECT_EQ(end(report), ExitCode::kCannotWrite);
+  EXPECT_TRUE(Json::accept(directory_.read("b")));
+}
+
+TEST_F(RunReportTest, ShowsLogLinesUpToTheirLevelByTheWallClock) {
+  ReportOptions options;
+  options.shownLog = LogLevel::kDefault;
+  RunReport report(options, console_);
+  report.take(beginningOf("A"));
+  report.take(Logged{{{}, LogLevel::kError, "an error", momentAt(250)}});
+  report.take(Logged{{{}, LogLevel::kDefault, "two\nlines", momentAt(1000)}});
+  report.take(Logged{{{}, LogLevel::kDebug, "a detail", momentAt(1001)}});
+  const std::string category(sharedLog().category());
+  EXPECT_EQ(err_.str(), "2026-11-21 01:08:00.250 error " + category + ": an error\n" +
+                            "2026-11-21 01:08:01.000 default " + category + ": two\n    lines\n");
+}
+
+TEST_F(RunReportTest, ShowsLogLinesThatCannotSteerTheTerminal) {
+  RunReport report({}, console_);
+  report.take(beginningOf("A"));
+  report.take(Logged{{{}, LogLevel::kError, "a\033[2Jb\r\xFF\xC2\x9B\tc\nd\a\n", momentAt(250)}});
+  const std::string category(sharedLog().category());
+  EXPECT_EQ(err_.str(), "2026-11-21 01:08:00.250 error " + category + ": a\\x1b[2Jb\\x0d\\xff\\x9b\tc\n    d\\x07\n");
+}
+
+TEST_F(RunReportTest, ShowsNothingThatIsNotUtf8OnTheStandardOutput) {
+  RunReport report({}, console_);
+  report.take(runOf({}));
+  DiagnosticRecord record = quietRecord("N\xFF", Verdict::kError);
+  record.measuredResults.clear();
+  record.measuredResults.push_back({QZMeasuredResult("r\xC3", Measurement(1, QZDimensionlessUnit::frames())), {}});
+  record.error = makeError("D", 1, "it\x80 broke");
+  takeAll(report, eventsOf(record));
+  end(report);
+  EXPECT_THAT(out_.str(), HasSubstr("N\\xff\n"));
+  EXPECT_THAT(out_.str(), HasSubstr("  r\\xc3 "));
+  EXPECT_THAT(out_.str(), HasSubstr("D code 1: it\\x80 broke\n"));
+}
+
+TEST_F(RunReportTest, ShowsTheProgressOfWhatIsRunning) {
+  console_.showsProgress = true;
+  RunReport report({}, console_);
+  EXPECT_TRUE(report.progress().isShown());
+  report.take(beginningOf("Slow"));
+  while (err_.str().empty()) report.progress().update();
+  EXPECT_EQ(err_.str(), "Running Slow: 0.3 s of 3 s");
+  report.take(Logged{{{}, LogLevel::kError, "a line", momentAt(250)}});
+  EXPECT_THAT(err_.str(), testing::StartsWith("Running Slow: 0.3 s of 3 s\r\033[K2026-11-21"));
+  report.take(DiagnosticEnded{Verdict::kPass, momentAt(9)});
+  EXPECT_THAT(err_.str(), EndsWith("a line\n"));
+}
+
+TEST(ExitCodeOf, LetsAnErrorWinOverAFailure) {
+  const auto codeOf = [](const std::vector<Verdict>& verdicts) {
+    std::vector<DiagnosticRecord> records;
+    for (const Verdict verdict : verdicts) records.push_back(recordOf("A", verdict));
+    return exitCodeOf(records);
+  };
+  EXPECT_EQ(codeOf({}), ExitCode::kAllPassed);
+  EXPECT_EQ(codeOf({Verdict::kPass, Verdict::kPass}), ExitCode::kAllPassed);
+  EXPECT_EQ(codeOf({Verdict::kFail, Verdict::kPass}), ExitCode::kFailed);
+  EXPECT_EQ(codeOf({Verdict::kFail, Verdict::kError}), ExitCode::kError);
+  EXPECT_EQ(codeOf({Verdict::kError, Verdict::kFail}), ExitCode::kError);
+}
+
+}  // namespace
+}  // namespace quazor

@@ -1,0 +1,202 @@
+#include "host/report/text_report.h"
+
+#include "contract/message_format.h"
+#include "host/text/table.h"
+
+#include <algorithm>
+#include <string_view>
+#include <utility>
+
+namespace quazor {
+
+namespace {
+
+constexpr std::string_view kGreen = "\033[32m";
+constexpr std::string_view kRed = "\033[31m";
+constexpr std::string_view kYellow = "\033[33m";
+constexpr std::string_view kPlain = "\033[0m";
+
+std::string_view wordOf(const DiagnosticRecord& record) {
+  switch (record.verdict) {
+    case Verdict::kPass: return record.experimentOnly ? "DONE" : "PASS";
+    case Verdict::kFail: return "FAIL";
+    case Verdict::kError: break;
+  }
+  return "ERROR";
+}
+
+std::string_view colourOf(Verdict verdict) {
+  switch (verdict) {
+    case Verdict::kPass: return kGreen;
+    case Verdict::kFail: return kRed;
+    case Verdict::kError: break;
+  }
+  return kYellow;
+}
+
+std::string rangeText(const QZLimit& limit) {
+  const QZBound* lower = limit.lowerBound().get();
+  const QZBound* upper = limit.upperBound().get();
+  if (lower == nullptr && upper == nullptr) return "no bounds";
+  const bool one =
+      lower != nullptr && upper != nullptr && !lower->open() && !upper->open() && lower->value() == upper->value();
+  if (one) return formatMessage("= %@", lower->value().value());
+  std::string text;
+  if (lower != nullptr) text += formatMessage("%@ %@", lower->open() ? ">" : ">=", lower->value().value());
+  if (lower != nullptr && upper != nullptr) text += ", ";
+  if (upper != nullptr) text += formatMessage("%@ %@", upper->open() ? "<" : "<=", upper->value().value());
+  return text;
+}
+
+void printResults(std::ostream& out, const std::vector<JudgedResult>& results, bool colour) {
+  using Align = Table::Align;
+  Table table({Align::kLeft, Align::kRight, Align::kLeft, Align::kLeft, Align::kLeft});
+  table.addRow({"Result", "Value", "Unit", "Limit", "Verdict"});
+  for (const auto& [result, verdict] : results) {
+    const Measurement& measurement = result.measurement();
+    std::string_view before;
+    if (verdict == ResultVerdict::kPass) before = kGreen;
+    if (verdict == ResultVerdict::kFail) before = kRed;
+    if (!colour) before = {};
+    table.addRow({printable(result.name()), defaultText(measurement.value()), printable(measurement.unit().symbol()),
+                  limitText(result.limit()), verdict == ResultVerdict::kNone ? "-" : std::string(nameOf(verdict))},
+                 std::string(before), std::string(before.empty() ? std::string_view() : kPlain));
+  }
+  table.print(out, "  ");
+}
+
+void printHalf(std::ostream& out, std::string_view title, const std::string& name, const QZDescription& description,
+               const std::vector<BoundParameter>& parameters) {
+  out << "\n  " << title << ' ' << printable(name) << '\n' << indentedLines(description.summary(), "    ");
+  if (parameters.empty()) {
+    out << "    It takes no parameters.\n";
+    return;
+  }
+  using Align = Table::Align;
+  Table table({Align::kLeft, Align::kRight, Align::kLeft, Align::kLeft});
+  table.addRow({"Parameter", "Value", "From", "Meaning"});
+  for (const BoundParameter& one : parameters) {
+    const std::string unset = one.declaration.required() ? "not set, required" : "not set";
+    table.addRow({printable(one.name), one.value ? defaultText(*one.value) : "-",
+                  one.value ? printable(one.source) : unset, printable(one.declaration.summary())});
+  }
+  table.print(out, "    ");
+}
+
+std::string count(std::size_t number, std::string_view what) {
+  return std::to_string(number) + " " + std::string(what);
+}
+
+// What stands below the name in a description.
+std::string headline(const Diagnostic& diagnostic) {
+  if (!diagnostic.experimentOnly) return diagnostic.summary;
+  if (diagnostic.usedBy.empty()) return "An experiment that no diagnostic uses.";
+  std::string text = "An experiment; used by ";
+  std::string_view separator;
+  for (const std::string& user : diagnostic.usedBy) {
+    text += separator;
+    text += user;
+    separator = ", ";
+  }
+  return text + ".";
+}
+
+// What stands beside an experiment's name in a list.
+std::string listedSummary(const DescribedDiagnostic& one) {
+  const DiagnosticErrorPtr& error = one.description.error;
+  if (error != nullptr) return "could not be described: " + printable(error->localizedDescription());
+  return printable(one.summary());
+}
+
+}  // namespace
+
+std::string limitText(const std::optional<QZLimit>& limit) {
+  return limit ? printable(limit->name()) + ": " + rangeText(*limit) : "-";
+}
+
+std::string errorText(const DiagnosticErrorPtr& error, std::string_view indent) {
+  std::string text;
+  std::string_view link;
+  for (DiagnosticErrorPtr one = error; one != nullptr; one = one->underlyingError()) {
+    text += indent;
+    text += link;
+    text += printable(formatMessage("%@ code %@: %@", one->domain(), one->code(), one->localizedDescription()));
+    text += '\n';
+    link = "caused by ";
+  }
+  return text;
+}
+
+std::string verdictText(const DiagnosticRecord& record, bool colour) {
+  const std::string word(wordOf(record));
+  return colour ? std::string(colourOf(record.verdict)) + word + std::string(kPlain) : word;
+}
+
+void printRecord(std::ostream& out, const DiagnosticRecord& record, bool colour) {
+  out << printable(record.name) << '\n' << indentedLines(record.summary, "  ");
+  if (!record.measuredResults.empty()) {
+    out << '\n';
+    printResults(out, record.measuredResults, colour);
+  }
+  out << "\n  " << verdictText(record, colour) << '\n';
+  if (record.verdict == Verdict::kError) out << errorText(record.error, "    ");
+  out << '\n';
+}
+
+void printVerdict(std::ostream& out, const DiagnosticRecord& record, bool colour) {
+  const std::string padding(5 - wordOf(record).size(), ' ');
+  out << verdictText(record, colour) << padding << ' ' << printable(record.name) << '\n';
+}
+
+void printSummary(std::ostream& out, const std::vector<DiagnosticRecord>& records) {
+  const auto countOf = [&records](Verdict verdict) {
+    return static_cast<std::size_t>(std::count_if(
+        records.begin(), records.end(), [verdict](const DiagnosticRecord& one) { return one.verdict == verdict; }));
+  };
+  out << count(records.size(), records.size() == 1 ? "diagnostic" : "diagnostics") << ": "
+      << count(countOf(Verdict::kPass), "passed") << ", " << count(countOf(Verdict::kFail), "failed") << ", "
+      << count(countOf(Verdict::kError), "ended in an error") << '\n';
+}
+
+void printUnfiredFaults(std::ostream& out, const DiagnosticRecord& record) {
+  for (const DeclaredFault& fault : record.faults) {
+    if (fault.fired > 0) continue;
+    out << "quazor: " << printable(record.name) << ": a fault of the phone never fired: "
+        << fault.fault.dump(-1, ' ', true, nlohmann::ordered_json::error_handler_t::replace) << '\n';
+  }
+}
+
+void printList(std::ostream& out, const std::vector<DescribedDiagnostic>& diagnostics) {
+  Table ofDiagnostics({Table::Align::kLeft, Table::Align::kLeft});
+  Table ofExperiments({Table::Align::kLeft, Table::Align::kLeft});
+  bool hasDiagnostics = false;
+  bool hasExperiments = false;
+  for (const DescribedDiagnostic& one : diagnostics) {
+    const bool alone = one.diagnostic.experimentOnly;
+    (alone ? hasExperiments : hasDiagnostics) = true;
+    (alone ? ofExperiments : ofDiagnostics).addRow({printable(one.diagnostic.name), listedSummary(one)});
+  }
+  ofDiagnostics.print(out, "");
+  if (!hasExperiments) return;
+  if (hasDiagnostics) out << '\n';
+  out << "Experiments that no diagnostic uses; 'quazor experiment NAME' runs one:\n";
+  ofExperiments.print(out, "  ");
+}
+
+void printDescriptions(std::ostream& out, const std::vector<BoundDiagnostic>& diagnostics) {
+  std::string_view separator;
+  for (const auto& [described, parameters] : diagnostics) {
+    const auto& [diagnostic, description] = described;
+    out << separator << printable(diagnostic.name) << '\n' << indentedLines(headline(diagnostic), "  ");
+    separator = "\n";
+    if (description.error != nullptr) {
+      out << "\n  It could not be described.\n" << errorText(description.error, "    ");
+      continue;
+    }
+    printHalf(out, "Experiment", diagnostic.experimentName, description.experiment, parameters.experiment);
+    if (diagnostic.experimentOnly) continue;
+    printHalf(out, "Analysis", diagnostic.analysisName, description.analysis, parameters.analysis);
+  }
+}
+
+}  // namespace quazor

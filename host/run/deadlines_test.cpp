@@ -1,0 +1,111 @@
+#include "host/run/deadlines.h"
+
+#include "host/error/exit_code.h"
+
+#include <gmock/gmock.h>
+#include <gtest/gtest.h>
+
+#include <limits>
+
+namespace quazor {
+namespace {
+
+using namespace std::chrono_literals;
+using testing::HasSubstr;
+
+constexpr auto kYear = 365 * 24h;
+
+BoundParameters withParameters(const std::vector<std::pair<std::string, Value>>& values) {
+  BoundParameters parameters;
+  for (const auto& [name, value] : values) {
+    parameters.experiment.push_back({name, QZNumberParameter("", true), value, ""});
+  }
+  return parameters;
+}
+
+TEST(ParseDeadline, TakesSecondsOfOneStageOrOfAll) {
+  struct Row {
+    const char* text;
+    std::optional<Stage> stage;
+    std::chrono::nanoseconds time;
+  };
+  const Row rows[] = {
+      {"5", std::nullopt, 5s},        {"0.25", std::nullopt, 250ms},        {"1e-9", std::nullopt, 1ns},
+      {"load=1", Stage::kLoad, 1s},   {"describe=1", Stage::kDescribe, 1s}, {"setup=1", Stage::kSetup, 1s},
+      {"run=90", Stage::kRun, 90s},   {"teardown=1", Stage::kTeardown, 1s}, {"analyse=1", Stage::kAnalyse, 1s},
+      {"1e300", std::nullopt, kYear}, {"run=31536001", Stage::kRun, kYear},
+  };
+  for (const Row& row : rows) {
+    const DeadlineSetting setting = parseDeadline(row.text);
+    EXPECT_EQ(setting.stage, row.stage) << row.text;
+    EXPECT_EQ(setting.time, row.time) << row.text;
+  }
+}
+
+TEST(ParseDeadline, RefusesOtherTexts) {
+  struct Row {
+    const char* text;
+    const char* problem;
+  };
+  constexpr Row kRows[] = {
+      {"", "a number is missing"},
+      {"run=", "a number is missing"},
+      {"soon", "'soon' is not a number"},
+      {"5s", "'5s' is not a number"},
+      {"nan", "not a finite number"},
+      {"inf", "not a finite number"},
+      {"1e999", "outside the range of numbers"},
+      {"0", "the time must be above zero seconds"},
+      {"-1", "the time must be above zero seconds"},
+      {"run=-0.0", "the time must be above zero seconds"},
+      {"1e-30", "the time must be above zero seconds"},
+      {"=5", "there is no stage ''"},
+      {"runn=5", "there is no stage 'runn'; the stages are load, describe, setup, run, teardown and analyse"},
+      {"Run=5", "there is no stage 'Run'"},
+      {"run=5=6", "'5=6' is not a number"},
+  };
+  for (const Row& row : kRows) {
+    try {
+      parseDeadline(row.text);
+      ADD_FAILURE() << row.text << " was accepted";
+    } catch (const Refusal& refusal) {
+      EXPECT_EQ(refusal.code(), ExitCode::kUsage) << row.text;
+      EXPECT_THAT(refusal.what(), testing::StartsWith("--deadline '" + std::string(row.text) + "': ")) << row.text;
+      EXPECT_THAT(refusal.what(), HasSubstr(row.problem)) << row.text;
+    }
+  }
+}
+
+TEST(Deadlines, AreAMinuteWhereNothingIsKnown) {
+  const Deadlines deadlines({}, {});
+  for (const Stage stage : kStages) EXPECT_EQ(deadlines.of(stage), 60s) << nameOf(stage);
+}
+
+TEST(Deadlines, GiveARunAMinuteMoreThanTwiceTheTimeItIsToldToTake) {
+  EXPECT_EQ(Deadlines(withParameters({{"duration", 3}}), {}).of(Stage::kRun), 66s);
+  EXPECT_EQ(Deadlines(withParameters({{"timeout", 10}}), {}).of(Stage::kRun), 80s);
+  EXPECT_EQ(Deadlines(withParameters({{"timeout", 10}, {"duration", 0.5}}), {}).of(Stage::kRun), 61s);
+  EXPECT_EQ(Deadlines(withParameters({{"duration", -3}}), {}).of(Stage::kRun), 60s);
+  EXPECT_EQ(Deadlines(withParameters({{"duration", 3}}), {}).of(Stage::kSetup), 60s);
+  for (const double much : {1e300, std::numeric_limits<double>::max(), std::numeric_limits<double>::infinity()}) {
+    EXPECT_EQ(Deadlines(withParameters({{"duration", much}}), {}).of(Stage::kRun), kYear + 60s) << much;
+  }
+}
+
+TEST(Deadlines, TakeWhatIsSetOfOneStageForMoreThanWhatIsSetOfAll) {
+  const BoundParameters parameters = withParameters({{"duration", 3}});
+  const Deadlines all(parameters, {parseDeadline("5")});
+  for (const Stage stage : kStages) EXPECT_EQ(all.of(stage), 5s) << nameOf(stage);
+  for (const auto& settings : {std::vector{parseDeadline("run=7"), parseDeadline("5")},
+                               std::vector{parseDeadline("5"), parseDeadline("run=7")}}) {
+    const Deadlines both(parameters, settings);
+    EXPECT_EQ(both.of(Stage::kRun), 7s);
+    EXPECT_EQ(both.of(Stage::kAnalyse), 5s);
+  }
+  const Deadlines one(parameters, {parseDeadline("analyse=1"), parseDeadline("analyse=2")});
+  EXPECT_EQ(one.of(Stage::kAnalyse), 2s);
+  EXPECT_EQ(one.of(Stage::kRun), 66s);
+}
+
+}  // namespace
+}  // namespace quazor

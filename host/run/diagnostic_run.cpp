@@ -1,0 +1,223 @@
+#include "host/run/diagnostic_run.h"
+
+#include "host/error/host_error.h"
+#include "host/model/run_log.h"
+#include "host/plugin/idle_platform.h"
+#include "host/text/timestamp.h"
+
+#include <algorithm>
+#include <chrono>
+#include <cstddef>
+#include <memory>
+#include <mutex>
+#include <optional>
+#include <string>
+#include <utility>
+
+namespace quazor {
+
+namespace {
+
+// So many measurements or results go into one event that the events' own cost does not count, and so few that a reader
+// of them never waits for long.
+constexpr std::size_t kChunk = 500;
+
+// Lets one event through at a time.
+class OneAtATime final : public RunEventSink {
+ public:
+  explicit OneAtATime(RunEventSink& events) : events_(events) {}
+
+  void take(const RunEvent& event) override {
+    const std::lock_guard lock(mutex_);
+    events_.take(event);
+  }
+
+ private:
+  std::mutex mutex_;
+  RunEventSink& events_;
+};
+
+// The log of a run goes to its events as long as this lives.
+class LogOfRun {
+ public:
+  LogOfRun(std::shared_ptr<const Clock> clock, LogLevel level, RunEventSink& events)
+      : log_(std::make_shared<RunLog>(std::move(clock), events)), level_(level) {
+    sharedLog().setBackend(log_, level);
+  }
+  LogOfRun(const LogOfRun&) = delete;
+  LogOfRun& operator=(const LogOfRun&) = delete;
+  ~LogOfRun() {
+    sharedLog().setBackend(nullptr, level_);
+    log_->close();
+  }
+
+ private:
+  const std::shared_ptr<RunLog> log_;
+  const LogLevel level_;
+};
+
+// One run's state between its stages.
+class Run {
+ public:
+  Run(const Diagnostic& diagnostic, const BoundParameters& parameters, const Clock& clock, RunEventSink& events)
+      : diagnostic_(diagnostic), parameters_(parameters), clock_(clock), events_(events) {}
+
+  // The experiment's result, or null.
+  std::unique_ptr<QZExperimentResult> experiment() {
+    const std::string& name = diagnostic_.experimentName;
+    std::shared_ptr<QZExperiment> experiment;
+    inStage(Stage::kDescribe, [&] {
+      experiment = make(name, diagnostic_.makeExperiment,
+                        [](const QZExperiment& made) { static_cast<void>(made.experimentDescription()); });
+    });
+    if (experiment == nullptr) return nullptr;
+    bool ready = false;
+    inStage(Stage::kSetup, [&] {
+      const Dictionary parameters = dictionaryOf(parameters_.experiment);
+      ready = attempt("setup of " + name, [&](DiagnosticErrorPtr* error) {
+        return experiment->setupWithParameters(parameters, &host_, error);
+      });
+    });
+    if (!ready) return nullptr;
+    std::unique_ptr<QZExperimentResult> result;
+    inStage(Stage::kRun, [&] {
+      attempt("run of " + name, [&](DiagnosticErrorPtr* error) {
+        result = experiment->run(error);
+        return result != nullptr;
+      });
+    });
+    if (result != nullptr) tell(*result);
+    if (auto* const teardown = dynamic_cast<QZTeardown*>(experiment.get())) {
+      inStage(Stage::kTeardown, [&] {
+        attempt("teardown of " + name, [&](DiagnosticErrorPtr* error) { return teardown->teardown(error); });
+      });
+    }
+    return result;
+  }
+
+  void tell(const QZExperimentResult& result) {
+    Measured chunk;
+    for (const auto& one : result.measurements()) {
+      chunk.measurements.push_back(one);
+      if (chunk.measurements.size() < kChunk) continue;
+      events_.take(std::exchange(chunk, Measured()));
+    }
+    if (!chunk.measurements.empty()) events_.take(chunk);
+    for (const auto& [key, value] : result.auxiliaryData()) events_.take(Collected{key, value});
+  }
+
+  void analyse(const QZExperimentResult& measured) {
+    std::unique_ptr<QZAnalysisResult> result;
+    inStage(Stage::kAnalyse, [&] { result = analysis(measured); });
+    if (result == nullptr) return;
+    const std::vector<QZMeasuredResult>& results = result->measuredResults();
+    for (std::size_t i = 0; i < results.size(); i += kChunk) {
+      const auto begin = results.begin() + static_cast<std::ptrdiff_t>(i);
+      events_.take(Found{{begin, begin + static_cast<std::ptrdiff_t>(std::min(kChunk, results.size() - i))}});
+    }
+  }
+
+ private:
+  template <class Work>
+  void inStage(Stage stage, Work&& work) {
+    stage_ = stage;
+    events_.take(StageBegan{stage, dateNow()});
+    const std::chrono::nanoseconds begin = clock_.now();
+    std::forward<Work>(work)();
+    const std::chrono::nanoseconds duration = clock_.now() - begin;
+    events_.take(StageEnded{stage, duration, dateNow()});
+  }
+
+  // Calls into the plug-in.
+  template <class Call>
+  bool attempt(const std::string& operation, Call&& call) {
+    DiagnosticErrorPtr failure;
+    if (callPlugin(operation, &failure, std::forward<Call>(call))) return true;
+    events_.take(Failed{stage_, std::move(failure)});
+    return false;
+  }
+
+  // Makes an experiment or analysis by its factory, and asks its description as every host does.
+  template <class Made, class Describe>
+  std::shared_ptr<Made> make(const std::string& name, const std::function<std::shared_ptr<Made>()>& factory,
+                             Describe&& describe) {
+    std::shared_ptr<Made> made;
+    const bool usable =
+        attempt("making " + name,
+                [&](DiagnosticErrorPtr* error) {
+                  made = factory();
+                  if (made == nullptr)
+                    *error = hostError(HostErrorCode::kNothingMade, "the factory of " + name + " made nothing");
+                  return made != nullptr;
+                }) &&
+        attempt("describing " + name, [&](DiagnosticErrorPtr* /*error*/) {
+          describe(*made);
+          return true;
+        });
+    if (!usable) made = nullptr;
+    return made;
+  }
+
+  std::unique_ptr<QZAnalysisResult> analysis(const QZExperimentResult& measured) {
+    const std::string& name = diagnostic_.analysisName;
+    const auto analysis = make(name, diagnostic_.makeAnalysis,
+                               [](const QZAnalysis& made) { static_cast<void>(made.analysisDescription()); });
+    if (analysis == nullptr) return nullptr;
+    if (auto* const setup = dynamic_cast<QZAnalysisSetup*>(analysis.get())) {
+      const Dictionary parameters = dictionaryOf(parameters_.analysis);
+      const bool ready = attempt("setup of " + name, [&](DiagnosticErrorPtr* error) {
+        return setup->setupWithParameters(parameters, &host_, error);
+      });
+      if (!ready) return nullptr;
+    }
+    std::unique_ptr<QZAnalysisResult> result;
+    attempt("analyzing of " + name, [&](DiagnosticErrorPtr* error) {
+      result = analysis->analyzeExperimentResult(measured, error);
+      return result != nullptr;
+    });
+    return result;
+  }
+
+  const Diagnostic& diagnostic_;
+  const BoundParameters& parameters_;
+  const Clock& clock_;
+  RunEventSink& events_;
+  Stage stage_ = Stage::kDescribe;
+  QZDiagnosticHost host_;
+};
+
+}  // namespace
+
+void runDiagnostic(const Diagnostic& diagnostic, const BoundParameters& parameters, const RunOptions& options,
+                   RunEventSink& events) {
+  OneAtATime serial(events);
+  const std::shared_ptr<const Phone> phone = options.makePhone();
+  if (options.watchPhone) options.watchPhone(phone);
+  const Platform platform = phone->platform();
+  {
+    const LogOfRun log(platform.clock, options.logLevel, serial);
+    installPlatform(platform);
+    Run run(diagnostic, parameters, *platform.clock, serial);
+    const std::unique_ptr<QZExperimentResult> result = run.experiment();
+    if (result != nullptr && !diagnostic.experimentOnly) run.analyse(*result);
+    installPlatform(idlePlatform());
+  }
+  events.take(FaultsCounted{phone->faults()});
+  events.take(DiagnosticCompleted{});
+}
+
+void analyseResult(const Diagnostic& diagnostic, const BoundParameters& parameters, const QZExperimentResult& result,
+                   LogLevel logLevel, RunEventSink& events) {
+  OneAtATime serial(events);
+  const Platform platform = idlePlatform();
+  {
+    const LogOfRun log(platform.clock, logLevel, serial);
+    installPlatform(platform);
+    Run run(diagnostic, parameters, *platform.clock, serial);
+    run.tell(result);  // so that what the analysis makes of it can be analysed again
+    run.analyse(result);
+  }
+  events.take(DiagnosticCompleted{});
+}
+
+}  // namespace quazor

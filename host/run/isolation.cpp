@@ -1,0 +1,427 @@
+#include "host/run/isolation.h"
+
+#include "contract/message_format.h"
+#include "host/device/phone.h"
+#include "host/error/exit_code.h"
+#include "host/error/host_error.h"
+#include "host/plugin/plugin_loader.h"
+#include "host/record/lossless_json.h"
+#include "host/record/run_event_json.h"
+#include "host/system/shared_counter.h"
+#include "host/system/supervision.h"
+#include "host/text/timestamp.h"
+
+#include <unistd.h>
+
+#include <algorithm>
+#include <cerrno>
+#include <chrono>
+#include <cstddef>
+#include <cstdlib>
+#include <string_view>
+#include <thread>
+#include <utility>
+
+namespace quazor {
+
+namespace {
+
+using Json = nlohmann::ordered_json;
+using Moment = Supervision::Moment;
+using SteadyClock = std::chrono::steady_clock;
+using namespace std::chrono_literals;
+
+// The exit code of a child that found its connection gone.
+constexpr int kNoConnection = 113;
+// Of what a plug-in writes to its standard output, so many lines are kept, and so many octets.
+constexpr std::size_t kMostOutputLines = 10'000;
+constexpr std::size_t kMostOutput = 4'000'000;
+
+// The child's end of the connection: a line for each thing that it says.
+class Connection {
+ public:
+  explicit Connection(int descriptor) : descriptor_(descriptor), owner_(::getpid()) {}
+
+  void say(const Json& json) const {
+    if (::getpid() != owner_) ::_exit(EXIT_FAILURE);  // a copy of the process, which the plug-in made
+    const std::string line = json.dump(-1, ' ', false, Json::error_handler_t::replace) + "\n";
+    std::string_view left = line;
+    while (!left.empty()) {
+      const ssize_t written = ::write(descriptor_, left.data(), left.size());
+      if (written < 0 && errno != EINTR) ::_exit(kNoConnection);
+      if (written > 0) left.remove_prefix(static_cast<std::size_t>(written));
+    }
+  }
+
+ private:
+  const int descriptor_;
+  const pid_t owner_;
+};
+
+class EventsToConnection final : public RunEventSink {
+ public:
+  explicit EventsToConnection(const Connection& connection) : connection_(connection) {}
+
+  void take(const RunEvent& event) override { connection_.say(eventJson(event)); }
+
+ private:
+  const Connection& connection_;
+};
+
+std::string secondsText(std::chrono::nanoseconds time) {
+  return defaultText(std::chrono::duration<double>(time).count()) + " s";
+}
+
+// Why a process ended before its time. `during` is what it was doing.
+DiagnosticErrorPtr errorOf(const Supervised& supervised, const std::string& during, std::chrono::nanoseconds deadline) {
+  const std::string stuck = supervised.end ? std::string() : "; its process cannot be ended";
+  switch (supervised.how) {
+    case SupervisionEnd::kDeadline:
+      return hostError(HostErrorCode::kDeadline,
+                       during + " took longer than its deadline of " + secondsText(deadline) + stuck);
+    case SupervisionEnd::kInterrupted:
+      return hostError(HostErrorCode::kInterrupted, during + " was interrupted" + stuck);
+    case SupervisionEnd::kLineTooLong:
+      return hostError(HostErrorCode::kConnectionLost,
+                       during + " wrote more than " + std::to_string(kLongestEvent >> 20U) +
+                           " MiB in one line of its process' connection to quazor" + stuck);
+    case SupervisionEnd::kConnectionLost: break;
+    case SupervisionEnd::kEnded: {
+      const ProcessEnd& end = *supervised.end;
+      if (end.bySignal) {
+        return hostError(HostErrorCode::kCrashed, during + " crashed: its process was ended by " + textOf(end));
+      }
+      if (end.number == kNoConnection) break;
+      return hostError(HostErrorCode::kExited, during + " ended its own process, with " + textOf(end));
+    }
+  }
+  return hostError(HostErrorCode::kConnectionLost,
+                   during + " closed or overwrote its process' connection to quazor" + stuck);
+}
+
+// The files that register the diagnostic and its halves.
+std::vector<std::filesystem::path> pluginsOf(const Diagnostic& one, const std::vector<LoadedPlugin>& loaded) {
+  const auto isPart = [&one](const QZLab::Registration& registration) {
+    switch (registration.kind) {
+      case QZLab::Kind::kDiagnostic: return !one.experimentOnly && registration.name == one.name;
+      case QZLab::Kind::kExperiment: return registration.name == one.experimentName;
+      case QZLab::Kind::kAnalysis: break;
+    }
+    return !one.experimentOnly && registration.name == one.analysisName;
+  };
+  const std::vector<QZLab::Registration>& registrations = QZLab::defaultLab().registrations();
+  std::vector<std::filesystem::path> files;
+  auto first = registrations.begin();
+  for (const LoadedPlugin& plugin : loaded) {
+    const auto last = registrations.begin() + static_cast<std::ptrdiff_t>(plugin.last);
+    if (std::any_of(first, last, isPart)) files.push_back(plugin.file);
+    first = last;
+  }
+  return files;
+}
+
+// One attempt at a survey: what a process says until it ends.
+class SurveyAttempt {
+ public:
+  SurveyAttempt(const IsolationOptions& options, const std::vector<std::filesystem::path>& plugins, Survey& survey,
+                const DiagnosticChoice& described)
+      : deadlines_({}, options.deadlines),
+        memory_(options.memory),
+        plugins_(plugins),
+        survey_(survey),
+        described_(described),
+        known_(survey.catalogue.size()) {}
+
+  // True when the survey is complete.
+  bool perform(WatchedSignals& signals) {
+    beginStage(Stage::kLoad);
+    Supervised end;
+    {
+      ChildProcess child(
+          signals, [this](int descriptor) { speak(Connection(descriptor)); }, memory_, isCleanupProcess);
+      Supervision supervision;
+      supervision.takeLine = [this](std::string_view line) { return take(line); };
+      supervision.takeOutput = [](std::string_view /*line*/) {};  // there is no run whose log it could go to
+      supervision.deadline = [this] { return deadline_; };
+      supervision.isDone = [this] { return done_; };
+      end = supervise(child, signals, supervision);
+    }
+    if (refusal_) throw Refusal(*refusal_);
+    if (done_) return true;
+    if (end.how == SupervisionEnd::kInterrupted) survey_.interrupted = true;
+    blame(end);
+    return survey_.interrupted;
+  }
+
+  // What failed while it was loaded.
+  const std::optional<std::filesystem::path>& failedPlugin() const { return failedPlugin_; }
+
+ private:
+  // In the child.
+  void speak(const Connection& connection) const {
+    try {
+      const std::vector<LoadedPlugin> loaded = loadPlugins(plugins_, [&connection](const std::filesystem::path& file) {
+        connection.say({{"says", "loading"}, {"plugin", losslessText(file.string())}});
+      });
+      std::vector<Diagnostic> catalogue = catalogueOf(QZLab::defaultLab());
+      for (Diagnostic& one : catalogue) one.plugins = pluginsOf(one, loaded);
+      Json all = Json::array();
+      for (const Diagnostic& one : catalogue) all.push_back(diagnosticJson(one));
+      connection.say({{"says", "catalogue"}, {"catalogue", std::move(all)}});
+      const std::vector<Diagnostic> wanted = described_(catalogue);
+      for (std::size_t i = known_; i < catalogue.size(); ++i) {
+        connection.say({{"says", "describing"}});
+        connection.say(
+            {{"says", "described"}, {"description", descriptionJson(describeIfWanted(catalogue[i], wanted))}});
+      }
+      connection.say({{"says", "done"}});
+    } catch (const Refusal& refusal) {
+      connection.say(
+          {{"says", "refused"}, {"code", static_cast<int>(refusal.code())}, {"text", losslessText(refusal.what())}});
+    }
+  }
+
+  bool take(std::string_view line) {
+    try {
+      const Json said = Json::parse(line);
+      const std::string what = memberOf(said, "says").get<std::string>();
+      if (what == "loading") {
+        loading_ = textFrom(memberOf(said, "plugin"));
+        beginStage(Stage::kLoad);
+      } else if (what == "catalogue") {
+        for (const Json& one : memberOf(said, "catalogue")) catalogue_.push_back(diagnosticFrom(one));
+        loading_.reset();
+      } else if (what == "describing") {
+        beginStage(Stage::kDescribe);
+      } else if (what == "described") {
+        describe(descriptionFrom(memberOf(said, "description")));
+      } else if (what == "refused") {
+        refusal_ = Refusal(static_cast<ExitCode>(memberOf(said, "code").get<int>()), textFrom(memberOf(said, "text")));
+        done_ = true;
+      } else {
+        done_ = what == "done";
+        return done_;
+      }
+      return true;
+    } catch (const Json::exception&) {
+    } catch (const BadRecord&) {
+    }
+    return false;
+  }
+
+  void describe(DiagnosticDescription description) {
+    if (survey_.catalogue.size() >= catalogue_.size()) throw BadRecord("there is more described than there is");
+    survey_.catalogue.push_back({catalogue_[survey_.catalogue.size()], std::move(description)});
+  }
+
+  void beginStage(Stage stage) {
+    stage_ = stage;
+    deadline_ = SteadyClock::now() + deadlines_.of(stage);
+  }
+
+  // Blames the plug-in that was being loaded, or else what was being described, for the end of the process.
+  void blame(const Supervised& end) {
+    const std::chrono::nanoseconds deadline = deadlines_.of(stage_);
+    if (survey_.catalogue.size() < catalogue_.size()) {
+      DiagnosticDescription description;
+      description.error = errorOf(end, "describing " + catalogue_[survey_.catalogue.size()].name, deadline);
+      describe(std::move(description));
+      return;
+    }
+    const std::filesystem::path file = loading_ ? std::filesystem::path(*loading_) : plugins_.back();
+    failedPlugin_ = file;
+    survey_.failed.push_back({file, errorOf(end, "loading the plug-in '" + file.string() + "'", deadline)});
+  }
+
+  const Deadlines deadlines_;
+  const std::optional<std::uint64_t> memory_;
+  const std::vector<std::filesystem::path>& plugins_;
+  Survey& survey_;
+  const DiagnosticChoice& described_;
+  const std::size_t known_;
+  std::vector<Diagnostic> catalogue_;
+  std::optional<std::string> loading_;
+  std::optional<std::filesystem::path> failedPlugin_;
+  std::optional<Refusal> refusal_;
+  Stage stage_ = Stage::kLoad;
+  Moment deadline_;
+  bool done_ = false;
+};
+
+// One run in a process of its own, seen from outside.
+class IsolatedRun {
+ public:
+  IsolatedRun(const Diagnostic& diagnostic, const Deadlines& deadlines, Progress& progress, RunEventSink& events)
+      : diagnostic_(diagnostic), deadlines_(deadlines), progress_(progress), events_(events) {
+    beginStage(Stage::kLoad);
+  }
+
+  Supervision supervision() {
+    Supervision supervision;
+    supervision.takeLine = [this](std::string_view line) { return take(line); };
+    supervision.takeOutput = [this](std::string_view line) { takeOutput(line); };
+    supervision.deadline = [this] { return deadline_; };
+    supervision.isDone = [this] { return completed_; };
+    supervision.tick = [this] { progress_.update(); };
+    return supervision;
+  }
+
+  void conclude(const Supervised& end) {
+    if (droppedLines_ > 0) log(formatMessage("%@ more lines of output were dropped", droppedLines_));
+    if (completed_) return;
+    const std::string during = formatMessage("the stage %@ of %@", nameOf(stage_), diagnostic_.name);
+    events_.take(Failed{stage_, errorOf(end, during, deadlines_.of(stage_))});
+  }
+
+ private:
+  bool take(std::string_view line) {
+    std::optional<RunEvent> event;
+    try {
+      event = eventFrom(Json::parse(line));
+    } catch (const Json::exception&) {
+    } catch (const BadRecord&) {
+    }
+    if (!event || completed_ || isOfHost(*event)) return false;
+    if (const auto* const began = std::get_if<StageBegan>(&*event)) beginStage(began->stage);
+    if (const auto* const logged = std::get_if<Logged>(&*event)) time_ = logged->line.time;
+    // What comes between two stages may be much, but it comes; log lines may come for ever.
+    if (std::holds_alternative<StageEnded>(*event)) between_ = true;
+    if (between_ && !std::holds_alternative<Logged>(*event)) deadline_ = SteadyClock::now() + deadlines_.of(stage_);
+    completed_ = std::holds_alternative<DiagnosticCompleted>(*event);
+    events_.take(*event);
+    return true;
+  }
+
+  static bool isOfHost(const RunEvent& event) {
+    const auto* const failed = std::get_if<Failed>(&event);
+    return std::holds_alternative<RunBegan>(event) || std::holds_alternative<DiagnosticBegan>(event) ||
+           std::holds_alternative<DiagnosticEnded>(event) || std::holds_alternative<RunEnded>(event) ||
+           (failed != nullptr && !failed->stage);
+  }
+
+  void takeOutput(std::string_view line) {
+    const bool isTooMuch = outputLines_ == kMostOutputLines || line.size() > kMostOutput - output_;
+    if (isTooMuch || droppedLines_ > 0) {
+      ++droppedLines_;
+      return;
+    }
+    ++outputLines_;
+    output_ += line.size();
+    log("output: " + std::string(line));
+  }
+
+  void log(std::string text) { events_.take(Logged{{time_, LogLevel::kDefault, std::move(text), dateNow()}}); }
+
+  void beginStage(Stage stage) {
+    stage_ = stage;
+    between_ = false;
+    deadline_ = SteadyClock::now() + deadlines_.of(stage);
+  }
+
+  const Diagnostic& diagnostic_;
+  const Deadlines& deadlines_;
+  Progress& progress_;
+  RunEventSink& events_;
+  Stage stage_ = Stage::kLoad;
+  Moment deadline_;
+  std::chrono::nanoseconds time_{};  // of the last log line
+  std::size_t outputLines_ = 0;      // that are kept
+  std::size_t output_ = 0;           // octets of them
+  std::size_t droppedLines_ = 0;
+  bool between_ = false;
+  bool completed_ = false;
+};
+
+// Those of the plug-ins that the diagnostic needs: another one that ends its process would end this one's.
+std::vector<std::filesystem::path> pluginsFor(const Diagnostic& diagnostic,
+                                              std::vector<std::filesystem::path> plugins) {
+  if (diagnostic.plugins.empty()) return plugins;
+  std::erase_if(plugins, [&needed = diagnostic.plugins](const std::filesystem::path& file) {
+    return std::find(needed.begin(), needed.end(), file) == needed.end();
+  });
+  return plugins;
+}
+
+// In the child: the catalogue's own diagnostic, with its factories; nothing, and a failure, when there is none.
+std::optional<Diagnostic> loadDiagnostic(const IsolationOptions& options, const Diagnostic& wanted,
+                                         RunEventSink& events) {
+  std::optional<Diagnostic> found;
+  events.take(StageBegan{Stage::kLoad, dateNow()});
+  std::string problem = "the plug-ins no longer register " + wanted.name;
+  try {
+    loadSomePlugins(pluginsFor(wanted, options.plugins));
+    for (const Diagnostic& one : catalogueOf(QZLab::defaultLab())) {
+      if (one.name == wanted.name && one.experimentOnly == wanted.experimentOnly) found = one;
+    }
+  } catch (const Refusal& refusal) {
+    problem = refusal.what();
+  }
+  if (!found) events.take(Failed{Stage::kLoad, hostError(HostErrorCode::kNothingMade, problem)});
+  events.take(StageEnded{Stage::kLoad, std::nullopt, dateNow()});
+  return found;
+}
+
+// Copies the number of a phone's frames to where the watching process sees it, while the phone lives.
+void countFrames(const std::weak_ptr<const Phone>& phone, SharedCounter& counter) {
+  std::thread([phone, &counter] {
+    while (const std::shared_ptr<const Phone> one = phone.lock()) {
+      counter.set(one->framesDelivered());
+      std::this_thread::sleep_for(50ms);
+    }
+  }).detach();
+}
+
+}  // namespace
+
+IsolationOptions withoutFailed(IsolationOptions options, const std::vector<FailedPlugin>& failed) {
+  for (const FailedPlugin& plugin : failed) std::erase(options.plugins, plugin.file);
+  return options;
+}
+
+Survey surveyPlugins(const IsolationOptions& options, WatchedSignals& signals, const DiagnosticChoice& described) {
+  Survey survey;
+  std::vector<std::filesystem::path> plugins = options.plugins;
+  while (!plugins.empty()) {
+    SurveyAttempt attempt(options, plugins, survey, described);
+    if (attempt.perform(signals)) break;
+    if (!attempt.failedPlugin()) continue;
+    survey.catalogue.clear();  // an earlier attempt may have found what that plug-in registers
+    // What is not among the plug-ins that were named is a plug-in's own invention.
+    if (std::erase(plugins, *attempt.failedPlugin()) == 0) plugins.clear();
+  }
+  return survey;
+}
+
+bool runIsolated(const IsolationOptions& options, WatchedSignals& signals, const Diagnostic& diagnostic,
+                 const BoundParameters& parameters, const RunOptions& runOptions, const QZExperimentResult* result,
+                 Progress& progress, RunEventSink& events) {
+  const Deadlines deadlines(parameters, options.deadlines);
+  SharedCounter frames;
+  if (progress.isShown()) progress.countFrames([&frames] { return frames.get(); });
+  const auto body = [&](int descriptor) {
+    const Connection connection(descriptor);
+    EventsToConnection toParent(connection);
+    const std::optional<Diagnostic> loaded = loadDiagnostic(options, diagnostic, toParent);
+    if (!loaded) {
+      toParent.take(DiagnosticCompleted{});
+    } else if (result != nullptr) {
+      analyseResult(*loaded, parameters, *result, runOptions.logLevel, toParent);
+    } else {
+      RunOptions watched = runOptions;
+      if (progress.isShown()) {
+        watched.watchPhone = [&frames](const std::shared_ptr<const Phone>& phone) { countFrames(phone, frames); };
+      }
+      runDiagnostic(*loaded, parameters, watched, toParent);
+    }
+  };
+  IsolatedRun run(diagnostic, deadlines, progress, events);
+  Supervised end;
+  {
+    ChildProcess child(signals, body, options.memory, isCleanupProcess);
+    end = supervise(child, signals, run.supervision());
+  }
+  run.conclude(end);
+  return end.how != SupervisionEnd::kInterrupted;
+}
+
+}  // namespace quazor

@@ -1,0 +1,24 @@
+// What children do in tests of this folder.
+#pragma once
+
+#include <cstddef>
+#include <string_view>
+
+#include <unistd.h>
+
+namespace quazor {
+
+// Writes all of the text, or ends the process with exit code 99.
+inline void say(int descriptor, std::string_view text) {
+  while (!text.empty()) {
+    const ssize_t written = ::write(descriptor, text.data(), text.size());
+    if (written <= 0) ::_exit(99);
+    text.remove_prefix(static_cast<std::size_t>(written));
+  }
+}
+
+[[noreturn]] inline void hang() {
+  for (;;) ::pause();
+}
+
+}  // namespace quazor

@@ -1,0 +1,221 @@
+#include "host/system/child_process.h"
+
+#include <dirent.h>
+#include <fcntl.h>
+#include <linux/close_range.h>
+#include <poll.h>
+#include <sys/prctl.h>
+#include <sys/resource.h>
+#include <sys/signalfd.h>
+#include <sys/syscall.h>
+#include <sys/wait.h>
+#include <unistd.h>
+
+#include <algorithm>
+#include <cerrno>
+#include <chrono>
+#include <cstdio>
+#include <cstdlib>
+#include <cstring>
+#include <filesystem>
+#include <fstream>
+#include <system_error>
+#include <thread>
+
+namespace quazor {
+
+namespace {
+
+using namespace std::chrono_literals;
+using SteadyClock = std::chrono::steady_clock;
+
+// Out of the way of descriptors that a plug-in opens, and of small numbers that it may close by mistake.
+constexpr int kConnection = 250;
+constexpr SteadyClock::duration kLongestWait = 5s;
+// How long a process that restores the hardware may take for it.
+constexpr SteadyClock::duration kLongestTidying = 1s;
+
+[[noreturn]] void refuse(const char* what) { throw std::system_error(errno, std::generic_category(), what); }
+
+sigset_t watchedSet() {
+  sigset_t set;
+  sigemptyset(&set);
+  sigaddset(&set, SIGCHLD);
+  for (const int one : {SIGINT, SIGTERM, SIGHUP}) {
+    struct sigaction action {};
+    if (sigaction(one, nullptr, &action) == 0 && action.sa_handler == SIG_IGN) continue;
+    sigaddset(&set, one);
+  }
+  return set;
+}
+
+struct Pipe {
+  int readEnd = -1;
+  int writeEnd = -1;
+};
+
+Pipe makePipe() {
+  int ends[2] = {};
+  if (::pipe2(ends, O_CLOEXEC) != 0) refuse("making a pipe");
+  ::fcntl(ends[0], F_SETFL, O_NONBLOCK);
+  return {ends[0], ends[1]};
+}
+
+// The processes whose parent is this one (proc(5), /proc/PID/stat, field 4).
+std::vector<pid_t> childrenOfThisProcess() {
+  std::vector<pid_t> children;
+  const pid_t self = ::getpid();
+  std::error_code error;
+  for (const auto& entry : std::filesystem::directory_iterator("/proc", error)) {
+    const std::string name = entry.path().filename();
+    if (name.find_first_not_of("0123456789") != std::string::npos) continue;
+    std::ifstream file(entry.path() / "stat");
+    std::string line;
+    std::getline(file, line);
+    const std::size_t afterName = line.rfind(')');  // the name may hold anything
+    int parent = 0;
+    if (afterName == std::string::npos || std::sscanf(line.c_str() + afterName, ") %*c %d", &parent) != 1) continue;
+    if (parent == self) children.push_back(static_cast<pid_t>(std::stol(name)));
+  }
+  return children;
+}
+
+// The name of a process, or nothing when it has ended.
+std::string nameOfProcess(pid_t process) {
+  std::ifstream file("/proc/" + std::to_string(process) + "/comm");
+  std::string name;
+  std::getline(file, name);
+  return name;
+}
+
+// Where there may be fewer descriptors, it is the last.
+int numberOfConnection() {
+  rlimit limit{};
+  ::getrlimit(RLIMIT_NOFILE, &limit);
+  return static_cast<int>(std::min<rlim_t>(kConnection, limit.rlim_cur - 1));
+}
+
+// Returns the number of the child's end of the connection.
+int becomeChild(pid_t parent, const WatchedSignals& signals, const Pipe& connection, const Pipe& output,
+                std::optional<std::uint64_t> memory) {
+  ::setpgid(0, 0);
+  ::prctl(PR_SET_PDEATHSIG, SIGKILL);
+  if (::getppid() != parent) ::_exit(EXIT_FAILURE);  // it ended before it could be watched
+  const int nothing = ::open("/dev/null", O_RDONLY | O_CLOEXEC);
+  ::dup2(nothing, STDIN_FILENO);
+  ::dup2(output.writeEnd, STDOUT_FILENO);
+  ::dup2(output.writeEnd, STDERR_FILENO);
+  const int number = numberOfConnection();
+  ::dup3(connection.writeEnd, number, O_CLOEXEC);
+  ::syscall(SYS_close_range, 3, number - 1, 0);
+  ::syscall(SYS_close_range, number + 1, ~0U, 0);
+  if (memory) {
+    const rlimit limit{*memory, *memory};
+    ::setrlimit(RLIMIT_AS, &limit);
+  }
+  signals.restore();
+  return number;
+}
+
+// An exception ends the child as any other program: it must not reach the callers of the process that was copied.
+void doWork(const std::function<void(int)>& body, int connection) noexcept { body(connection); }
+
+}  // namespace
+
+std::string textOf(const ProcessEnd& end) {
+  const std::string number = std::to_string(end.number);
+  if (!end.bySignal) return "exit code " + number;
+  const char* const name = ::sigabbrev_np(end.number);
+  return "signal " + number + (name == nullptr ? std::string() : " (SIG" + std::string(name) + ")");
+}
+
+WatchedSignals::WatchedSignals() {
+  const sigset_t watched = watchedSet();
+  descriptor_ = ::signalfd(-1, &watched, SFD_CLOEXEC | SFD_NONBLOCK);
+  if (descriptor_ < 0) refuse("watching for signals");
+  ::sigprocmask(SIG_BLOCK, &watched, &before_);
+  // Where the ends of children are ignored, as some programs leave it to those that they start, nobody can wait for
+  // them.
+  struct sigaction action {};
+  action.sa_handler = SIG_DFL;
+  ::sigaction(SIGCHLD, &action, &childrenBefore_);
+  // What a child's children leave behind comes to this process, which ends it.
+  ::prctl(PR_SET_CHILD_SUBREAPER, 1);
+}
+
+WatchedSignals::~WatchedSignals() {
+  ::close(descriptor_);
+  ::prctl(PR_SET_CHILD_SUBREAPER, 0);
+  restore();
+}
+
+void WatchedSignals::drain() {
+  signalfd_siginfo taken;
+  while (::read(descriptor_, &taken, sizeof taken) == sizeof taken) {
+    if (taken.ssi_signo != SIGCHLD) ++requestsToEnd_;
+  }
+}
+
+void WatchedSignals::restore() const {
+  ::sigaction(SIGCHLD, &childrenBefore_, nullptr);
+  ::sigprocmask(SIG_SETMASK, &before_, nullptr);
+}
+
+ChildProcess::ChildProcess(const WatchedSignals& signals, const std::function<void(int)>& body,
+                           std::optional<std::uint64_t> memory, IsCleanupProcess isCleanupProcess)
+    : isCleanupProcess_(isCleanupProcess), others_(childrenOfThisProcess()) {
+  const Pipe connection = makePipe();
+  const Pipe output = makePipe();
+  const pid_t parent = ::getpid();
+  std::fflush(nullptr);
+  id_ = ::fork();
+  if (id_ < 0) refuse("making a process");
+  if (id_ == 0) {
+    doWork(body, becomeChild(parent, signals, connection, output, memory));
+    ::_exit(EXIT_SUCCESS);
+  }
+  ::setpgid(id_, id_);  // whoever comes first
+  ::close(connection.writeEnd);
+  ::close(output.writeEnd);
+  connection_ = connection.readEnd;
+  output_ = output.readEnd;
+}
+
+ChildProcess::~ChildProcess() {
+  ::close(connection_);
+  ::close(output_);
+  const SteadyClock::time_point begin = SteadyClock::now();
+  signalGroup(SIGKILL);
+  for (;;) {
+    std::vector<pid_t> left;
+    for (const pid_t one : childrenOfThisProcess()) {
+      if (std::find(others_.begin(), others_.end(), one) != others_.end()) continue;
+      const bool isRestoring = isCleanupProcess_ != nullptr && isCleanupProcess_(nameOfProcess(one));
+      if (!isRestoring || SteadyClock::now() >= begin + kLongestTidying) ::kill(one, SIGKILL);
+      if (::waitpid(one, nullptr, WNOHANG) == 0) left.push_back(one);
+    }
+    // What has been ended may have left further ones to this process, so only a look that finds nobody is the last.
+    if (left.empty() && childrenOfThisProcess().size() <= others_.size()) return;
+    if (SteadyClock::now() >= begin + kLongestWait) return;
+    std::this_thread::sleep_for(1ms);
+  }
+}
+
+const std::optional<ProcessEnd>& ChildProcess::end() {
+  siginfo_t info{};
+  // The system keeps the child until the destructor takes it, so that its number means no other process before.
+  if (!end_ && ::waitid(P_PID, static_cast<id_t>(id_), &info, WEXITED | WNOHANG | WNOWAIT) == 0 && info.si_pid == id_) {
+    end_ = ProcessEnd{info.si_code != CLD_EXITED, info.si_status};
+  }
+  return end_;
+}
+
+void ChildProcess::signalGroup(int signal) const {
+  // The child may have left its group.
+  for (const pid_t whom : {-id_, id_}) {
+    ::kill(whom, signal);
+    ::kill(whom, SIGCONT);
+  }
+}
+
+}  // namespace quazor

@@ -1,0 +1,207 @@
+#include "host/system/supervision.h"
+
+#include <poll.h>
+#include <unistd.h>
+
+#include <algorithm>
+#include <array>
+#include <cerrno>
+
+namespace quazor {
+
+namespace {
+
+using namespace std::chrono_literals;
+using Moment = Supervision::Moment;
+using SteadyClock = std::chrono::steady_clock;
+
+constexpr std::chrono::milliseconds kTick = 100ms;
+// How long a child may take to end by itself when it has nothing more to say, and after SIGTERM.
+constexpr std::chrono::milliseconds kGrace = 500ms;
+// How long a killed process is waited for: one that is stuck in the kernel does not end.
+constexpr std::chrono::seconds kLongestDeath = 5s;
+constexpr std::size_t kLongestOutput = 1U << 16;
+
+// Cuts what is read from a descriptor into lines. One that is longer than `longest`, in octets, is cut too or, with
+// kRefuse, dropped: reading is over then.
+class LineReader {
+ public:
+  enum class LongLines { kCut, kRefuse };
+
+  LineReader(int descriptor, std::size_t longest, LongLines longLines)
+      : descriptor_(descriptor), longest_(longest), longLines_(longLines) {}
+
+  int descriptor() const { return descriptor_; }
+  // True when nothing more will come.
+  bool atEnd() const { return atEnd_; }
+  // True when a line was too long and was dropped.
+  bool hasRefused() const { return hasRefused_; }
+
+  // Reads what there is, up to a bound, and hands its lines on until `take` returns false, or a line is refused.
+  // Returns that.
+  template <class Take>
+  bool read(Take&& take) {
+    std::array<char, 65536> octets;
+    for (int i = 0; i < kMostReads; ++i) {
+      const ssize_t count = ::read(descriptor_, octets.data(), octets.size());
+      if (count < 0) return true;  // nothing at the moment
+      if (count == 0) {
+        atEnd_ = true;
+        return true;
+      }
+      text_.append(octets.data(), static_cast<std::size_t>(count));
+      if (!cut(take)) return false;
+    }
+    return true;
+  }
+
+  // What came after the last end of a line.
+  const std::string& rest() const { return text_; }
+
+ private:
+  // So many that reading is not interrupted for each, and so few that other descriptors have their turn.
+  static constexpr int kMostReads = 16;
+
+  template <class Take>
+  bool cut(Take&& take) {
+    std::size_t begin = 0;
+    bool goOn = true;
+    for (std::size_t end = text_.find('\n', searched_); goOn && end != std::string::npos;
+         end = text_.find('\n', begin)) {
+      goOn = take(std::string_view(text_).substr(begin, end - begin));
+      begin = end + 1;
+    }
+    text_.erase(0, begin);
+    if (goOn && text_.size() > longest_) {
+      hasRefused_ = longLines_ == LongLines::kRefuse;
+      goOn = !hasRefused_ && take(text_);
+      text_.clear();
+    }
+    searched_ = text_.size();
+    return goOn;
+  }
+
+  const int descriptor_;
+  const std::size_t longest_;
+  const LongLines longLines_;
+  std::string text_;
+  std::size_t searched_ = 0;  // there is no end of a line before
+  bool atEnd_ = false;
+  bool hasRefused_ = false;
+};
+
+class Supervisor {
+ public:
+  Supervisor(ChildProcess& child, WatchedSignals& signals, const Supervision& supervision)
+      : child_(child),
+        signals_(signals),
+        supervision_(supervision),
+        connection_(child.connectionDescriptor(), kLongestEvent, LineReader::LongLines::kRefuse),
+        output_(child.outputDescriptor(), kLongestOutput, LineReader::LongLines::kCut),
+        requestsBefore_(signals.requestsToEnd()) {}
+
+  Supervised run() {
+    while (!child_.end() && !gaveUp_) {
+      wait();
+      signals_.drain();
+      readAll();
+      decide();
+    }
+    drainEnded();
+    return {how_, child_.end()};
+  }
+
+ private:
+  void wait() const {
+    std::array<pollfd, 3> watched = {{{signals_.descriptor(), POLLIN, 0},
+                                      {connection_.atEnd() ? -1 : connection_.descriptor(), POLLIN, 0},
+                                      {output_.atEnd() ? -1 : output_.descriptor(), POLLIN, 0}}};
+    const auto left = std::chrono::ceil<std::chrono::milliseconds>(nextMoment() - SteadyClock::now());
+    const auto timeout = std::clamp(left, std::chrono::milliseconds(0), kTick);
+    ::poll(watched.data(), watched.size(), static_cast<int>(timeout.count()));
+  }
+
+  Moment nextMoment() const { return limit_ ? *limit_ : supervision_.deadline(); }
+
+  void readAll() {
+    isBad_ =
+        !connection_.read([this](std::string_view line) { return !isBad_ && supervision_.takeLine(line); }) || isBad_;
+    output_.read([this](std::string_view line) {
+      supervision_.takeOutput(line);
+      return true;
+    });
+    if (supervision_.tick) supervision_.tick();
+  }
+
+  void decide() {
+    if (child_.end()) return;
+    const Moment now = SteadyClock::now();
+    if (limit_) {
+      goOnEnding(now);
+    } else if (supervision_.isDone()) {
+      limit_ = now + kGrace;  // it ends by itself
+    } else if (signals_.requestsToEnd() > requestsBefore_) {
+      beginEnding(SupervisionEnd::kInterrupted, now);
+    } else if (isBad_) {
+      beginEnding(endOfBadConnection(), now);
+    } else if (connection_.atEnd()) {
+      // A process that ends closes its connection a moment before.
+      how_ = SupervisionEnd::kConnectionLost;
+      limit_ = now + kGrace;
+      endsByItself_ = true;
+    } else if (now >= supervision_.deadline()) {
+      beginEnding(SupervisionEnd::kDeadline, now);
+    }
+  }
+
+  SupervisionEnd endOfBadConnection() const {
+    return connection_.hasRefused() ? SupervisionEnd::kLineTooLong : SupervisionEnd::kConnectionLost;
+  }
+
+  void beginEnding(SupervisionEnd how, Moment now) {
+    how_ = how;
+    child_.signalGroup(SIGTERM);
+    limit_ = now + kGrace;
+  }
+
+  void goOnEnding(Moment now) {
+    const bool impatient = signals_.requestsToEnd() > requestsBefore_ + 1;
+    if (now < *limit_ && !(impatient && !killed_)) return;
+    gaveUp_ = killed_;
+    killed_ = true;
+    endsByItself_ = false;
+    child_.signalGroup(SIGKILL);
+    limit_ = now + kLongestDeath;
+  }
+
+  // What the child wrote before its end is still to be read: it is in the pipes, which hold less than is read at once.
+  void drainEnded() {
+    if (endsByItself_ && child_.end()) how_ = SupervisionEnd::kEnded;
+    child_.signalGroup(SIGKILL);
+    readAll();
+    // It ended by itself after it had written what is no line; what came then has not been taken.
+    if (isBad_ && how_ == SupervisionEnd::kEnded && !child_.end()->bySignal) how_ = endOfBadConnection();
+    if (!output_.rest().empty()) supervision_.takeOutput(output_.rest());
+  }
+
+  ChildProcess& child_;
+  WatchedSignals& signals_;
+  const Supervision& supervision_;
+  LineReader connection_;
+  LineReader output_;
+  const int requestsBefore_;
+  SupervisionEnd how_ = SupervisionEnd::kEnded;
+  std::optional<Moment> limit_;  // while the child is expected to end
+  bool endsByItself_ = false;
+  bool killed_ = false;
+  bool gaveUp_ = false;
+  bool isBad_ = false;
+};
+
+}  // namespace
+
+Supervised supervise(ChildProcess& child, WatchedSignals& signals, const Supervision& supervision) {
+  return Supervisor(child, signals, supervision).run();
+}
+
+}  // namespace quazor

@@ -1,8 +1,0 @@
-// A plug-in for tests of the host: it registers nothing.
-#include "frame/lab.h"
-
-namespace {
-
-[[gnu::constructor, gnu::used]] void registerNothing() { static_cast<void>(quazor::QZLab::defaultLab()); }
-
-}  // namespace

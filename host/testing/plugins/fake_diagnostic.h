@@ -1,0 +1,69 @@
+// A diagnostic for tests, whose parameters say what it does.
+#pragma once
+
+#include "contract/diagnostic_contract.h"
+#include "platform/platform.h"
+
+#include <memory>
+
+namespace quazor::fake {
+
+// Values of the parameter "behaviour".
+enum class Behaviour {
+  kNormal = 0,
+
+  // Of the experiment.
+  kSetupFails = 1,
+  kSetupFailsWithoutError = 2,
+  kSetupThrows = 3,
+  kSetupThrowsAnInteger = 4,
+  kRunFails = 5,  // with an error that has an underlying one
+  kRunFailsWithoutError = 6,
+  kRunThrows = 7,
+  kRunSucceedsWithError = 8,  // gives a result, and an error beside it
+  kTeardownFails = 9,
+  kTeardownThrows = 10,
+  kRunAndTeardownFail = 11,
+  kRunThrowsAnInteger = 12,
+
+  // Of the analysis.
+  kAnalysisSetupFails = 20,
+  kAnalysisSetupThrows = 21,
+  kAnalyzingFails = 22,
+  kAnalyzingFailsWithoutError = 23,
+  kAnalyzingThrows = 24,
+  kNothingMeasured = 25,
+  kBoundInAnotherUnit = 26,
+  kNotANumber = 27,
+};
+
+// Parameters: "duration", required, the seconds it sleeps by the platform's clock; "measured", what it measures;
+// "behaviour". The result has the measurement "Count" and auxiliary data of several kinds.
+class FakeExperiment : public QZExperiment, public QZTeardown {
+ public:
+  QZDescription experimentDescription() const override;
+  bool setupWithParameters(const Dictionary& parameters, QZDiagnosticHost* host, DiagnosticErrorPtr* error) override;
+  std::unique_ptr<QZExperimentResult> run(DiagnosticErrorPtr* error) override;
+  bool teardown(DiagnosticErrorPtr* error) override;
+
+ private:
+  Behaviour behaviour_ = Behaviour::kNormal;
+  double duration_ = 0;  // seconds
+  double measured_ = 0;
+};
+
+// Parameters: "minimum", the closed lower bound of the result "Count"; "behaviour". There is a second result, "Echo",
+// without a limit.
+class FakeAnalysis : public QZAnalysis, public QZAnalysisSetup {
+ public:
+  QZDescription analysisDescription() const override;
+  bool setupWithParameters(const Dictionary& parameters, QZDiagnosticHost* host, DiagnosticErrorPtr* error) override;
+  std::unique_ptr<QZAnalysisResult> analyzeExperimentResult(const QZExperimentResult& result,
+                                                            DiagnosticErrorPtr* error) override;
+
+ private:
+  Behaviour behaviour_ = Behaviour::kNormal;
+  double minimum_ = 0;
+};
+
+}  // namespace quazor::fake

@@ -1,0 +1,24 @@
+// An experiment for tests that gives images of samples.
+#pragma once
+
+#include "contract/diagnostic_contract.h"
+
+#include <cstdint>
+#include <memory>
+
+namespace quazor::fake {
+
+// Parameters: "images", required, how many images the result has; "samples", how many samples each of their two lists
+// has, 48 when not set. Sample k of list "i" is k - 10, of list "q" it is -1000 k.
+class ImageExperiment final : public QZExperiment {
+ public:
+  QZDescription experimentDescription() const override;
+  bool setupWithParameters(const Dictionary& parameters, QZDiagnosticHost* host, DiagnosticErrorPtr* error) override;
+  std::unique_ptr<QZExperimentResult> run(DiagnosticErrorPtr* error) override;
+
+ private:
+  std::uint64_t images_ = 0;
+  std::int64_t samples_ = 0;
+};
+
+}  // namespace quazor::fake

@@ -1,0 +1,99 @@
+// A plug-in for tests of the host: diagnostics that do not go by the rules, each in its own way.
+#include "contract/lab.h"
+#include "contract/log_channel.h"
+#include "host/testing/plugins/fake_diagnostic.h"
+
+#include <signal.h>
+#include <unistd.h>
+
+#include <cstdio>
+#include <cstdlib>
+#include <memory>
+#include <string>
+#include <string_view>
+#include <vector>
+
+namespace quazor::fake {
+
+namespace {
+
+// Where quazor's processes have their connection.
+constexpr int kConnection = 250;
+
+void tell(std::string_view text) {
+  if (::write(kConnection, text.data(), text.size()) < 0) ::_exit(99);
+}
+
+// The values of the parameter "way".
+void goWrong(int way) {
+  switch (way) {
+    case 1: std::abort();
+    case 2: ::_exit(3);
+    case 3:
+      for (;;) ::pause();
+    case 4: ::close(kConnection); break;
+    case 5: tell("garbage\n"); break;
+    case 6:
+      tell("{\"event\":\"diagnosticEnded\",\"verdict\":\"pass\",\"date\":\"2026-11-21T01:08:00.000000000Z\"}\n");
+      break;
+    case 7: std::printf("printed\ntwice"); break;
+    case 8:
+      for (int i = 0; i < 10'003; ++i) std::printf("%d\n", i);
+      break;
+    case 9: tell("{\"event\":\"failed\",\"error\":{\"domain\":\"D\",\"code\":1,\"userInfo\":[]}}\n"); break;
+    case 10: tell("{\"event\":\"diagnosticCompleted\"}\n"); break;
+    case 11: static_cast<void>(std::vector<char>(std::size_t{4} << 30)); break;
+    case 12:
+      tell("{\"event\":\"diagnosticCompleted\"}\n");
+      ::usleep(50'000);
+      ::kill(::getppid(), SIGINT);
+      break;
+    case 13:
+      for (int i = 0; i < 300; ++i) {
+        logError("again");
+        ::usleep(10'000);
+      }
+      break;
+    case 14:
+      for (int i = 0; i < 100; ++i) std::printf("%s\n", std::string(60'000, 'x').c_str());
+      break;
+    case 15:
+      for (;;) tell(std::string(1'000'000, 'x'));
+    default: break;
+  }
+  std::fflush(stdout);
+}
+
+class UnrulyExperiment final : public FakeExperiment {
+ public:
+  QZDescription experimentDescription() const override {
+    QZDescription description("Goes its own way.");
+    description.addParameter(QZNumberParameter("Which way.", true), "way");
+    return description;
+  }
+
+  bool setupWithParameters(const Dictionary& parameters, QZDiagnosticHost* host, DiagnosticErrorPtr* error) override {
+    way_ = toInt32(parameters.find("way"));
+    return FakeExperiment::setupWithParameters(parameters, host, error);
+  }
+
+  std::unique_ptr<QZExperimentResult> run(DiagnosticErrorPtr* error) override {
+    std::unique_ptr<QZExperimentResult> result = FakeExperiment::run(error);
+    goWrong(way_);
+    return result;
+  }
+
+ private:
+  int way_ = 0;
+};
+
+[[gnu::constructor]] void registerUnruly() {
+  QZLab& lab = QZLab::defaultLab();
+  lab.addAnalysisWithName("UnrulyAnalysis", [] { return std::make_shared<FakeAnalysis>(); });
+  lab.addExperimentWithName("UnrulyExperiment", [] { return std::make_shared<UnrulyExperiment>(); });
+  lab.addDiagnosticWithName("Unruly", "Goes its own way.", "UnrulyExperiment", "UnrulyAnalysis");
+}
+
+}  // namespace
+
+}  // namespace quazor::fake

@@ -1,0 +1,38 @@
+// A phone for tests of runs.
+#pragma once
+
+#include "host/device/phone.h"
+#include "host/plugin/idle_platform.h"
+
+#include <chrono>
+#include <memory>
+#include <vector>
+
+namespace quazor {
+
+// A clock whose time passes only in sleep(). It begins at 7 s.
+class ManualClock final : public Clock {
+ public:
+  std::chrono::nanoseconds now() const override { return time; }
+  Date date() const override { return Date(time); }
+  void sleep(std::chrono::nanoseconds duration) override { time += duration; }
+
+  std::chrono::nanoseconds time = std::chrono::seconds(7);
+};
+
+// A phone on which only time passes. It says that one fault fired three times, and that 17 frames have come.
+class TestPhone final : public Phone {
+ public:
+  Platform platform() const override {
+    Platform platform = idlePlatform();
+    platform.clock = clock_;
+    return platform;
+  }
+  std::vector<DeclaredFault> faults() const override { return {{{{"operation", "x"}}, 3}}; }
+  std::uint64_t framesDelivered() const override { return 17; }
+
+ private:
+  std::shared_ptr<Clock> clock_ = std::make_shared<ManualClock>();
+};
+
+}  // namespace quazor

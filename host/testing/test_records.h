@@ -1,0 +1,48 @@
+// Records for tests of reports.
+#pragma once
+
+#include "host/model/diagnostic_record.h"
+
+#include <chrono>
+#include <memory>
+#include <string>
+#include <utility>
+
+namespace quazor {
+
+inline QZMeasuredResult resultWithMinimum(double value, double minimum) {
+  QZMeasuredResult result("Count", Measurement(value, QZDimensionlessUnit::frames()));
+  QZLimit limit("Enough");
+  limit.setLowerBound(std::make_shared<const QZBound>(Measurement(minimum, QZDimensionlessUnit::frames()), false));
+  result.setLimit(std::move(limit));
+  return result;
+}
+
+// A record with one limited result, one for information, and something of everything else.
+inline DiagnosticRecord recordOf(const std::string& name, Verdict verdict) {
+  using namespace std::chrono_literals;
+  DiagnosticRecord record;
+  record.name = name;
+  record.summary = "Its summary.";
+  record.verdict = verdict;
+  record.parameters.experiment.push_back({"duration", QZNumberParameter("", true), Value(3), "command line"});
+  record.parameters.experiment.push_back({"gain", QZNumberParameter("", false), std::nullopt, ""});
+  const double value = verdict == Verdict::kFail ? 89 : 90;
+  const ResultVerdict judged = verdict == Verdict::kFail ? ResultVerdict::kFail : ResultVerdict::kPass;
+  record.measuredResults.push_back({resultWithMinimum(value, 90), judged});
+  record.measuredResults.push_back(
+      {QZMeasuredResult("Offset", Measurement(0.5, QZDimensionlessUnit::events())), ResultVerdict::kNone});
+  record.measurements.set("Raw", Measurement(value, QZDimensionlessUnit::frames()));
+  record.auxiliaryData.set("bytes", Bytes{0xA5});
+  record.log.push_back({250ms, LogLevel::kError, "a line"});
+  record.faults.push_back({{{"operation", "CaptureStream.start"}}, 1});
+  record.seed = 7;
+  record.durations = {0ns, 3s, std::nullopt, 0ns};
+  if (verdict == Verdict::kError) {
+    const DiagnosticErrorPtr cause = errorWithMessage("Deep", 2, "the cause", nullptr);
+    record.error = errorWithMessage("Domain", -1, "it failed", cause);
+  }
+  return record;
+}
+
+}  // namespace quazor

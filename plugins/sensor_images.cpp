@@ -1,0 +1,18 @@
+// What this plug-in registers with the host's lab when it is loaded. The name is public and permanent.
+#include "contract/lab.h"
+#include "diagnostics/sensor_images/nimbe_image_experiment.h"
+
+#include <memory>
+
+namespace quazor {
+
+namespace {
+
+[[gnu::constructor]] void registerSensorImages() {
+  QZLab::defaultLab().addExperimentWithName("NimbeImageExperiment",
+                                            [] { return std::make_shared<QZNimbeImageExperiment>(); });
+}
+
+}  // namespace
+
+}  // namespace quazor

@@ -1,0 +1,263 @@
+#include "tests/support/hand_made_camera.h"
+
+#include "platform/capture_keys.h"
+
+#include <cstdint>
+#include <string>
+
+namespace quazor {
+
+namespace {
+
+constexpr int kSafetyBit = 0x2000;
+
+// What the module attaches to every frame, in its order.
+Dictionary metadata(int lightSource, int hardwareEvents) {
+  return Dictionary{{"MetaDataProjectorMode", 0},
+                    {std::string(capture_key::InfraredLightSource), lightSource},
+                    {"MetaDataProjectorIndex", 1},
+                    {"MetaDataProjectorPowerLow", 2},
+                    {"MetaDataProjectorPowerHigh", 3},
+                    {"MetaDataProjectorPowerFlood", 4},
+                    {"MetaDataProjectorProbeMode", 5},
+                    {"MetaDataProjectorPowerProbeA", 6},
+                    {"MetaDataProjectorPowerProbeB", 7},
+                    {"MetaDataProjectorPulseWidth", 8},
+                    {std::string(capture_key::FloodActiveTemperature), 36.5},
+                    {"NTCTemperatureIdle", 9},
+                    {"NTCTemperatureStandby", 10},
+                    {"NTCTemperatureActive", 11},
+                    {"DIETemperatureIdle", 12},
+                    {"DIETemperatureStandby", 13},
+                    {"DIETemperatureActive", 14},
+                    {"HardwareEvents", hardwareEvents}};
+}
+
+Dictionary incompleteMetadata() {
+  Dictionary numbers = metadata(1, 0);
+  numbers.erase("HardwareEvents");
+  return numbers;
+}
+
+std::optional<Value> metadataOf(FrameKind kind) {
+  static const Value lit(metadata(1, 0));
+  static const Value unlit(metadata(0, 0));
+  static const Value unlitForSafety(metadata(0, kSafetyBit));
+  static const Value wrong("no dictionary");
+  static const Value incomplete(incompleteMetadata());
+  switch (kind) {
+    case FrameKind::kLit: return lit;
+    case FrameKind::kUnlit: return unlit;
+    case FrameKind::kUnlitForSafety: return unlitForSafety;
+    case FrameKind::kWithWrongMetadata: return wrong;
+    case FrameKind::kWithIncompleteMetadata: return incomplete;
+    case FrameKind::kWithoutMetadata: break;
+  }
+  return std::nullopt;
+}
+
+class HandMadeDevice final : public CaptureDevice {
+ public:
+  explicit HandMadeDevice(std::shared_ptr<HandMadeStream> stream) : stream_(std::move(stream)) {}
+
+  std::string description() const override { return "device"; }
+  std::optional<Value> valueForProperty(std::string_view, DiagnosticErrorPtr*) override { return std::nullopt; }
+  bool setValue(const Value&, std::string_view, DiagnosticErrorPtr*) override { return false; }
+  std::optional<CaptureStreams> streams(DiagnosticErrorPtr*) override { return CaptureStreams{stream_}; }
+  std::optional<SynchronizedStreamsGroups> synchronizedStreamsGroups(DiagnosticErrorPtr*) override {
+    return SynchronizedStreamsGroups{};
+  }
+  bool requestControlOfStreams(const CaptureStreams&, DiagnosticErrorPtr*) override { return true; }
+  bool relinquishControlOfStreams(const CaptureStreams&, DiagnosticErrorPtr*) override { return true; }
+  bool invalidate(DiagnosticErrorPtr*) override { return true; }
+
+ private:
+  std::shared_ptr<HandMadeStream> stream_;
+};
+
+class HandMadePlugIn final : public CapturePlugIn {
+ public:
+  explicit HandMadePlugIn(std::shared_ptr<HandMadeStream> stream)
+      : device_(std::make_shared<HandMadeDevice>(std::move(stream))) {}
+
+  std::string description() const override { return "plug-in"; }
+  std::shared_ptr<CaptureDevice> device(DiagnosticErrorPtr*) override { return device_; }
+
+ private:
+  std::shared_ptr<CaptureDevice> device_;
+};
+
+class HandMadeCapture final : public CaptureService {
+ public:
+  explicit HandMadeCapture(std::shared_ptr<HandMadeStream> stream)
+      : plugIn_(std::make_shared<HandMadePlugIn>(std::move(stream))) {}
+
+  std::shared_ptr<CapturePlugIn> createPlugIn() override { return plugIn_; }
+  std::shared_ptr<CapturePlugIn> defaultPlugIn() override { return plugIn_; }
+
+ private:
+  std::shared_ptr<CapturePlugIn> plugIn_;
+};
+
+// Every channel at the same count.
+class HandMadeSnapshot final : public ReportSnapshot {
+ public:
+  HandMadeSnapshot(std::shared_ptr<const HandMadeReports::Descriptions> channels, std::uint64_t count)
+      : channels_(std::move(channels)) {
+    samples_.reserve(channels_->size());
+    for (const auto& channel : *channels_) samples_.emplace_back(ReportChannel(channel, count));
+  }
+
+  const std::vector<ReportSample>& samples() const override { return samples_; }
+  std::shared_ptr<const ReportSnapshot> snapshotWithBaseline(const ReportSnapshot& baseline,
+                                                             DiagnosticErrorPtr*) const override {
+    return std::make_shared<HandMadeSnapshot>(channels_, samples_.empty() ? 0 : countOf(*this) - countOf(baseline));
+  }
+
+ private:
+  static std::uint64_t countOf(const ReportSnapshot& snapshot) {
+    return toUnsigned(pointerTo(snapshot.samples().front().channel().count()));
+  }
+
+  std::shared_ptr<const HandMadeReports::Descriptions> channels_;
+  std::vector<ReportSample> samples_;
+};
+
+class HandMadeChannelSet final : public ReportChannelSet {
+ public:
+  HandMadeChannelSet(std::shared_ptr<const HandMadeReports::Descriptions> channels, std::uint64_t growth)
+      : channels_(std::move(channels)), growth_(growth) {}
+
+  std::shared_ptr<const ReportChannelSet> reportByFilteringChannels(const Predicate& keep) const override {
+    auto kept = std::make_shared<HandMadeReports::Descriptions>();
+    for (const auto& channel : *channels_) {
+      if (keep(*channel)) kept->push_back(channel);
+    }
+    return std::make_shared<HandMadeChannelSet>(std::move(kept), growth_);
+  }
+  std::shared_ptr<const ReportSnapshot> snapshot(DiagnosticErrorPtr*) const override {
+    return std::make_shared<HandMadeSnapshot>(channels_, growth_ * snapshots_.fetch_add(1));
+  }
+
+ private:
+  std::shared_ptr<const HandMadeReports::Descriptions> channels_;
+  std::uint64_t growth_;
+  mutable std::atomic<std::uint64_t> snapshots_{0};
+};
+
+}  // namespace
+
+std::string_view nameOf(FrameKind kind) {
+  switch (kind) {
+    case FrameKind::kLit: return "lit";
+    case FrameKind::kUnlit: return "unlit";
+    case FrameKind::kUnlitForSafety: return "unlit for safety";
+    case FrameKind::kWithoutMetadata: return "without metadata";
+    case FrameKind::kWithWrongMetadata: return "with wrong metadata";
+    case FrameKind::kWithIncompleteMetadata: return "with incomplete metadata";
+  }
+  return "of no known kind";
+}
+
+std::optional<Value> HandMadeBuffer::attachment(std::string_view key) const {
+  if (onRead) onRead();
+  return key == capture_key::MetadataDictionary ? metadataOf(kind_) : std::nullopt;
+}
+
+void HandMadeBuffer::renew(FrameKind kind) {
+  kind_ = kind;
+  references_.store(0);
+}
+
+HandMadeStream::HandMadeStream() : errorCounters(handMadeErrorCounters()) {}
+
+std::optional<Value> HandMadeStream::valueForProperty(std::string_view key, DiagnosticErrorPtr*) {
+  if (key == capture_key::PortType) return Value(port_type::FrontFacingInfraredCamera);
+  if (key != capture_key::ErrorCounters) return std::nullopt;
+  if (onCall) onCall("get ErrorCounters");
+  return errorCounters;
+}
+
+bool HandMadeStream::setValue(const Value& value, std::string_view key, DiagnosticErrorPtr*) {
+  if (key == capture_key::VideoOutputHandlers) {
+    const Value* handlers = entryOf(&value, capture_key::PrimaryScaler);
+    frames_ =
+        std::dynamic_pointer_cast<PixelBufferHandler>(entryOf(handlers, capture_key::PixelBufferHandler)->object());
+    events_ = std::dynamic_pointer_cast<EventHandler>(entryOf(handlers, capture_key::EventHandler)->object());
+  }
+  return true;
+}
+
+bool HandMadeStream::start(DiagnosticErrorPtr*) {
+  {
+    const std::lock_guard lock(mutex_);
+    running_ = true;
+  }
+  if (onCall) onCall("start");
+  return true;
+}
+
+bool HandMadeStream::stop(DiagnosticErrorPtr*) {
+  if (onCall) onCall("stop");
+  if (stops) {
+    std::unique_lock lock(mutex_);
+    running_ = false;
+    left_.wait(lock, [this] { return handlers_ == 0; });
+  }
+  if (onCall) onCall("stopped");
+  return stops;
+}
+
+bool HandMadeStream::deliver(PixelBuffer& buffer, MediaTime time) {
+  if (!enter()) return false;
+  (*frames_)(buffer, time);
+  leave();
+  return true;
+}
+
+bool HandMadeStream::deliverEvent(std::int32_t event, MediaTime time) {
+  if (!enter()) return false;
+  (*events_)(event, time, nullptr);
+  leave();
+  return true;
+}
+
+bool HandMadeStream::enter() {
+  const std::lock_guard lock(mutex_);
+  if (running_) ++handlers_;
+  return running_;
+}
+
+void HandMadeStream::leave() {
+  const std::lock_guard lock(mutex_);
+  if (--handlers_ == 0) left_.notify_all();
+}
+
+const Dictionary& handMadeErrorCounters() {
+  static const Dictionary counters{{"I2CErrorCount", 1},  {"MIPIErrorCount", 2}, {"LPDPErrorCount", 3},
+                                   {"UARTErrorCount", 4}, {"SIFErrorCount", 5},  {"ProjectorErrorCount", 6}};
+  return counters;
+}
+
+std::shared_ptr<CaptureService> makeHandMadeCapture(std::shared_ptr<HandMadeStream> stream) {
+  return std::make_shared<HandMadeCapture>(std::move(stream));
+}
+
+std::shared_ptr<const ReportChannelSet> HandMadeReports::reportWithOnlySimpleChannels(DiagnosticErrorPtr*) {
+  return std::make_shared<HandMadeChannelSet>(channels_, growth_);
+}
+
+HandMadeReports::Descriptions handMadeChannels(std::size_t count) {
+  // All in one place, which every pointer to one of them keeps.
+  const auto descriptions = std::make_shared<std::vector<ReportChannelDescription>>();
+  for (std::size_t i = 0; i < count; ++i) {
+    const std::string name = "Channel " + std::to_string(i);
+    for (const char* subGroup : {"K42ISP Events", "Other Events"}) descriptions->push_back({"K42ISP", subGroup, name});
+  }
+  HandMadeReports::Descriptions channels;
+  channels.reserve(descriptions->size());
+  for (const ReportChannelDescription& description : *descriptions) channels.emplace_back(descriptions, &description);
+  return channels;
+}
+
+}  // namespace quazor

@@ -1,0 +1,31 @@
+// A program that runs the projector fault experiment with a timeout of some thirty years, ends the run by a frame, and
+// then ends itself, the timeout still pending. Prints the steady clock's nanoseconds at the end of the run.
+#include "backends/threads/real_clock.h"
+#include "backends/threads/thread_concurrency.h"
+#include "diagnostics/projector_fault/tessel_fault_experiment.h"
+#include "tests/support/hand_made_camera.h"
+
+#include <cstdio>
+#include <memory>
+#include <string_view>
+
+int main() {
+  using namespace quazor;
+  // Its experiment is never destroyed, and may look at its clock to the very end.
+  const auto clock = std::make_shared<RealClock>();
+  const auto stream = std::make_shared<HandMadeStream>();
+  HandMadeBuffer buffer;
+  stream->onCall = [&buffer, frames = stream.get()](std::string_view call) {
+    if (call == "start") frames->deliver(buffer, MediaTime{});
+  };
+  auto experiment = std::make_shared<QZTesselFaultExperiment>(
+      Platform{makeHandMadeCapture(stream), clock, std::make_shared<ThreadConcurrency>(),
+               std::make_shared<HandMadeReports>(handMadeChannels(1), 5)});
+  if (!experiment->setupWithParameters({{"frameCount", 1}, {"timeout", 1e9}}, nullptr, nullptr)) return 1;
+  if (experiment->run(nullptr) == nullptr || !experiment->teardown(nullptr)) return 1;
+  const std::weak_ptr<QZTesselFaultExperiment> watch = experiment;
+  experiment.reset();
+  if (watch.expired()) return 1;  // nothing was pending
+  std::printf("%lld\n", static_cast<long long>(clock->now().count()));
+  return 0;
+}

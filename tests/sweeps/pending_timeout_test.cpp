@@ -1,0 +1,139 @@
+// Who holds an experiment longest, and where and when it goes.
+#include "backends/threads/real_clock.h"
+#include "backends/threads/thread_concurrency.h"
+#include "contract/log_channel.h"
+#include "diagnostics/projector_fault/tessel_fault_experiment.h"
+#include "tests/support/hand_made_camera.h"
+
+#include <gtest/gtest.h>
+
+#include <chrono>
+#include <future>
+#include <memory>
+#include <string_view>
+#include <thread>
+
+namespace quazor {
+namespace {
+
+constexpr double kTimeout = 0.005;  // seconds
+constexpr std::chrono::milliseconds kLongestDelay(100);
+
+struct Moment {
+  std::chrono::steady_clock::time_point time = std::chrono::steady_clock::now();
+  std::thread::id thread = std::this_thread::get_id();
+};
+
+// Tells of the timeout's line.
+class TimeoutLog final : public LogBackend {
+ public:
+  void write(LogLevel, std::string_view, std::string_view, std::string_view text) override {
+    if (text == "Timeout has been reached.") timeout_.set_value(Moment());
+  }
+  Moment timeout() { return timeout_.get_future().get(); }
+
+ private:
+  std::promise<Moment> timeout_;
+};
+
+// A clock that belongs to the experiment alone, and so goes with it.
+class LastClock final : public Clock {
+ public:
+  explicit LastClock(std::promise<Moment>& end) : end_(end) {}
+  ~LastClock() override { end_.set_value(Moment()); }
+
+  std::chrono::nanoseconds now() const override { return clock_.now(); }
+  Date date() const override { return clock_.date(); }
+  void sleep(std::chrono::nanoseconds duration) override { clock_.sleep(duration); }
+
+ private:
+  RealClock clock_;
+  std::promise<Moment>& end_;
+};
+
+// An experiment that has had its run, with a timeout of a few milliseconds; until the end of this it is the log's only
+// experiment.
+class RunWithTimeout {
+ public:
+  // Ended by its first frame, or by the timeout.
+  explicit RunWithTimeout(bool hasFrame) {
+    sharedLog().setBackend(log_, LogLevel::kError);
+    if (hasFrame) {
+      stream_->onCall = [this](std::string_view call) {
+        if (call == "start") stream_->deliver(buffer_, MediaTime{});
+      };
+    }
+    experiment_ = std::make_shared<QZTesselFaultExperiment>(
+        Platform{makeHandMadeCapture(stream_), std::make_shared<LastClock>(end_), std::make_shared<ThreadConcurrency>(),
+                 std::make_shared<HandMadeReports>(handMadeChannels(1), 5)});
+    EXPECT_TRUE(experiment_->setupWithParameters({{"frameCount", 1}, {"timeout", kTimeout}}, nullptr, nullptr));
+    const auto result = experiment_->run(nullptr);
+    if (result == nullptr) {
+      ADD_FAILURE() << "the run failed";
+    } else if (hasFrame) {
+      EXPECT_EQ(result->measurements().find("FrameCount")->value(), 1);
+    } else {
+      EXPECT_EQ(result->measurements().find("FrameCount")->value(), 0);
+    }
+  }
+  RunWithTimeout(const RunWithTimeout&) = delete;
+  RunWithTimeout& operator=(const RunWithTimeout&) = delete;
+  ~RunWithTimeout() { sharedLog().setBackend(nullptr, LogLevel::kError); }
+
+  // How many hold the experiment.
+  long holders() const { return experiment_.use_count(); }
+  // Lets go of it; returns just before.
+  Moment release() {
+    const Moment moment;
+    experiment_.reset();
+    return moment;
+  }
+  // Waits for the timeout, and for the end of the experiment. Each once.
+  Moment timeout() { return log_->timeout(); }
+  Moment end() { return end_.get_future().get(); }
+
+ private:
+  const std::shared_ptr<TimeoutLog> log_ = std::make_shared<TimeoutLog>();
+  const std::shared_ptr<HandMadeStream> stream_ = std::make_shared<HandMadeStream>();
+  HandMadeBuffer buffer_;
+  std::promise<Moment> end_;
+  std::shared_ptr<QZTesselFaultExperiment> experiment_;
+};
+
+// A busy machine may be late sometimes; whoever is late every time is late by itself.
+constexpr int kAttempts = 10;
+
+TEST(PendingTimeout, TakesTheExperimentWithItWhenTheHostHasLetGo) {
+  for (int i = 0; i < kAttempts; ++i) {
+    RunWithTimeout run(true);
+    const Moment released = run.release();
+    const Moment timeout = run.timeout();
+    const Moment end = run.end();
+    if (released.time >= timeout.time || end.thread == std::this_thread::get_id()) continue;  // the host was late
+    EXPECT_EQ(end.thread, timeout.thread);
+    if (end.time - timeout.time < kLongestDelay) return;
+  }
+  FAIL() << "the experiment did not go in time";
+}
+
+TEST(PendingTimeout, LeavesTheExperimentToTheHostThatHoldsIt) {
+  RunWithTimeout run(true);
+  run.timeout();
+  for (int i = 0; i < 1000 && run.holders() > 1; ++i) std::this_thread::sleep_for(std::chrono::milliseconds(1));
+  ASSERT_EQ(run.holders(), 1);
+  run.release();
+  EXPECT_EQ(run.end().thread, std::this_thread::get_id());
+}
+
+TEST(PendingTimeout, HoldsNothingAfterItHasEndedTheRun) {
+  for (int i = 0; i < kAttempts; ++i) {
+    RunWithTimeout run(false);
+    const Moment timeout = run.timeout();
+    run.release();  // at the moment at which the timeout lets go too
+    if (run.end().time - timeout.time < kLongestDelay) return;
+  }
+  FAIL() << "the experiment did not go in time";
+}
+
+}  // namespace
+}  // namespace quazor

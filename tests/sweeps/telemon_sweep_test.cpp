@@ -1,0 +1,109 @@
+// Makes every call of a report channel presence run fail, and takes the count from every choice of its channels, and
+// compares each run to the last word with what the oracle says it must be.
+#include "backends/simulated/scenario/scenario.h"
+#include "backends/simulated/simulated_phone.h"
+#include "diagnostics/report_channels/tessel_telemon_experiment.h"
+#include "tests/support/run_transcript.h"
+#include "tests/sweeps/projector_bench.h"
+#include "tests/sweeps/projector_oracle.h"
+
+#include <gtest/gtest.h>
+
+#include <iostream>
+#include <optional>
+#include <string>
+#include <utility>
+#include <vector>
+
+namespace quazor {
+namespace {
+
+// Which call fails, from 1, or 0 for none; with an error of its own or without one.
+struct Failure {
+  std::size_t call = 0;
+  bool hasError = true;
+};
+
+class TelemonSweep : public testing::Test {
+ protected:
+  void TearDown() override { std::cout << "[sweep] " << cases_ << " cases\n"; }
+
+  void check(const Scenario& scenario, const Failure& failure, ErrorPlace place) {
+    ++cases_;
+    RunTranscript transcript;
+    SimulatedPhone phone(scenario, PhoneTime::kVirtual, cases_);
+    phone.observeCalls([&](const PlatformCall& call) {
+      transcript.addCall(call.operation, call.object, call.detail, call.succeeded);
+    });
+    projector_oracle::Failures failures;
+    if (failure.call != 0) {
+      Fault fault;
+      fault.operation = "*";
+      fault.occurrence = failure.call;
+      fault.action = failure.hasError ? FaultAction::kFail : FaultAction::kNothing;
+      if (failure.hasError) fault.error = FaultError{"SweepErrorDomain", -3, "Made to fail."};
+      phone.addFault(fault);
+      failures[failure.call] =
+          failure.hasError ? std::optional<std::string>("SweepErrorDomain code -3: Made to fail.") : std::nullopt;
+    }
+    std::vector<projector_oracle::PhoneChannel> channels;
+    for (const ReportChannelTraits& channel : scenario.reports) {
+      channels.push_back({channel.group, channel.subGroup, channel.name, channel.count});
+    }
+    const auto prediction = projector_oracle::predictPresenceRun(channels, failures, place == ErrorPlace::kGiven);
+    QZTesselTelemonExperiment experiment(phone.platform());
+    EXPECT_EQ(runAndTell(experiment, place, transcript), prediction.told);
+    if (failure.call != 0) {
+      EXPECT_EQ(phone.faultStatus().front().fired, failure.call <= prediction.calls ? 1U : 0U);
+    }
+  }
+
+  // Every failure there can be, none, and one behind the last call.
+  void checkEveryFailure(const Scenario& scenario) {
+    for (const ErrorPlace place : {ErrorPlace::kGiven, ErrorPlace::kNone}) {
+      for (std::size_t call = 0; call <= 3; ++call) {
+        for (const bool hasError : {true, false}) check(scenario, {call, hasError}, place);
+      }
+    }
+  }
+
+  std::uint64_t cases_ = 0;
+};
+
+TEST_F(TelemonSweep, EveryCallMayFailOnAHealthyPhone) {
+  std::string problem;
+  const auto scenario = readScenario(QUAZOR_SCENARIOS "/healthy.json", &problem);
+  ASSERT_TRUE(scenario) << problem;
+  ASSERT_GE(scenario->reports.size(), 60U);
+  checkEveryFailure(*scenario);
+}
+
+TEST_F(TelemonSweep, EveryCallMayFailWhicheverChannelsHaveACount) {
+  Scenario scenario = projectorScenario();
+  const std::size_t channels = scenario.reports.size();
+  for (unsigned counted = 0; counted < 1U << channels; ++counted) {
+    for (std::size_t i = 0; i < channels; ++i) {
+      scenario.reports[i].count = (counted >> i & 1U) != 0 ? std::optional<std::uint64_t>(i * 11) : std::nullopt;
+    }
+    checkEveryFailure(scenario);
+    ASSERT_FALSE(HasFailure()) << "counted " << counted;
+  }
+}
+
+// Substring by substring: groups and subgroups that are almost the right ones.
+TEST_F(TelemonSweep, EveryCallMayFailWhateverTheGroupsAreCalled) {
+  for (const char* const group : {"", "K42ISP", "K42IS", "42ISP", "xK42ISPx", "k42isp", "K42 ISP", "K42ISP Events"}) {
+    for (const char* const subGroup :
+         {"", "K42ISP Events", "K42ISP Event", "42ISP Events", "a K42ISP Events b", "K42ISP events", "K42ISPEvents"}) {
+      Scenario scenario = projectorScenario();
+      scenario.reports.resize(1);
+      scenario.reports.front().group = group;
+      scenario.reports.front().subGroup = subGroup;
+      checkEveryFailure(scenario);
+      ASSERT_FALSE(HasFailure()) << group << " / " << subGroup;
+    }
+  }
+}
+
+}  // namespace
+}  // namespace quazor
