@@ -22,7 +22,7 @@ class Lamp final : public Object {
   std::string text_;
 };
 
-constexpr double kHighestDouble = std::numeric_limits<double>::max();
+constexpr double kMaxDouble = std::numeric_limits<double>::max();
 constexpr double kInfinity = std::numeric_limits<double>::infinity();
 constexpr double kNan = std::numeric_limits<double>::quiet_NaN();
 
@@ -122,7 +122,7 @@ TEST(FormatMessageTest, WritesFixedPointWithSixDigits) {
 }
 
 TEST(FormatMessageTest, WritesTheLargestDoublesWithAllTheirDigits) {
-  for (const double number : {kHighestDouble, -kHighestDouble}) {
+  for (const double number : {kMaxDouble, -kMaxDouble}) {
     const std::string text = formatMessage("%lf", number);
     const std::string digits = number < 0 ? text.substr(1) : text;
     EXPECT_EQ(digits.size(), 309U + 7U);
@@ -181,7 +181,7 @@ TEST(DefaultTextTest, FloatingPointIsTheShortestThatReadsBack) {
       {1e22, "1e+22"},
       {0.001, "0.001"},
       {0.0001, "1e-04"},
-      {kHighestDouble, "1.7976931348623157e+308"},
+      {kMaxDouble, "1.7976931348623157e+308"},
       {-std::numeric_limits<double>::denorm_min(), "-5e-324"},
       {kInfinity, "inf"},
       {-kInfinity, "-inf"},

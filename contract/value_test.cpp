@@ -34,7 +34,7 @@ static_assert(std::is_convertible_v<unsigned char, Value>);
 
 constexpr auto kLowest64 = std::numeric_limits<std::int64_t>::min();
 constexpr auto kHighest64 = std::numeric_limits<std::int64_t>::max();
-constexpr auto kHighestUnsigned = std::numeric_limits<std::uint64_t>::max();
+constexpr auto kMaxUnsigned = std::numeric_limits<std::uint64_t>::max();
 constexpr double kInfinity = std::numeric_limits<double>::infinity();
 constexpr double kNan = std::numeric_limits<double>::quiet_NaN();
 
@@ -111,7 +111,7 @@ TEST(ValueTest, KeepsAStringWithANullCharacterWhole) {
 
 TEST(ValueTest, KeepsTheExtremesOf64Bits) {
   EXPECT_EQ(*Value(kLowest64).signedInteger(), kLowest64);
-  EXPECT_EQ(*Value(kHighestUnsigned).unsignedInteger(), kHighestUnsigned);
+  EXPECT_EQ(*Value(kMaxUnsigned).unsignedInteger(), kMaxUnsigned);
 }
 
 TEST(ValueTest, IsEqualOnlyInKindAndContent) {
@@ -189,7 +189,7 @@ const ReadingRow kReadingRows[] = {
     {"true", true, 1, 1, 1, 1, 1, true},
     {"false", false, 0, 0, 0, 0, 0, false},
     {"zero", 0, 0, 0, 0, 0, 0, false},
-    {"minus one keeps its low bits", -1, -1, -1, kHighestUnsigned, -1, 0xFFFF, true},
+    {"minus one keeps its low bits", -1, -1, -1, kMaxUnsigned, -1, 0xFFFF, true},
     {"65536 has no low 16 bits", 65536, 65536, 65536, 65536, 65536, 0, true},
     {"2 to the 32nd has no low 32 bits", std::int64_t{1} << 32, 4294967296.0, 4294967296, 4294967296, 0, 0, true},
     {"a signed integer's low 32 bits are signed", 0x80000001LL, 2147483649.0, 2147483649, 2147483649, -2147483647, 1,
@@ -197,8 +197,7 @@ const ReadingRow kReadingRows[] = {
     {"the lowest signed", kLowest64, -9223372036854775808.0, kLowest64, std::uint64_t{1} << 63, 0, 0, true},
     {"the highest signed", kHighest64, 9223372036854775807.0, kHighest64, (std::uint64_t{1} << 63) - 1, -1, 0xFFFF,
      true},
-    {"the highest unsigned reinterprets", kHighestUnsigned, 18446744073709551615.0, -1, kHighestUnsigned, -1, 0xFFFF,
-     true},
+    {"the highest unsigned reinterprets", kMaxUnsigned, 18446744073709551615.0, -1, kMaxUnsigned, -1, 0xFFFF, true},
     {"2 to the 63rd reinterprets", std::uint64_t{1} << 63, 9223372036854775808.0, kLowest64, std::uint64_t{1} << 63, 0,
      0, true},
     {"2.9 is cut to 2", 2.9, 2.9, 2, 2, 2, 2, true},
@@ -206,9 +205,9 @@ const ReadingRow kReadingRows[] = {
     {"0.5 is cut to 0 and still true", 0.5, 0.5, 0, 0, 0, 0, true},
     {"-0.5 is cut to 0 and still true", -0.5, -0.5, 0, 0, 0, 0, true},
     {"minus zero is false", -0.0, -0.0, 0, 0, 0, 0, false},
-    {"1e300 saturates", 1e300, 1e300, kHighest64, kHighestUnsigned, 2147483647, 65535, true},
+    {"1e300 saturates", 1e300, 1e300, kHighest64, kMaxUnsigned, 2147483647, 65535, true},
     {"-1e300 saturates", -1e300, -1e300, kLowest64, 0, -2147483647 - 1, 0, true},
-    {"infinity saturates", kInfinity, kInfinity, kHighest64, kHighestUnsigned, 2147483647, 65535, true},
+    {"infinity saturates", kInfinity, kInfinity, kHighest64, kMaxUnsigned, 2147483647, 65535, true},
     {"minus infinity saturates", -kInfinity, -kInfinity, kLowest64, 0, -2147483647 - 1, 0, true},
     {"2 to the 63rd saturates a signed one", 9223372036854775808.0, 9223372036854775808.0, kHighest64,
      std::uint64_t{1} << 63, 2147483647, 65535, true},
@@ -217,7 +216,7 @@ const ReadingRow kReadingRows[] = {
     {"minus 2 to the 63rd fits", -9223372036854775808.0, -9223372036854775808.0, kLowest64, 0, -2147483647 - 1, 0,
      true},
     {"2 to the 64th saturates an unsigned one", 18446744073709551616.0, 18446744073709551616.0, kHighest64,
-     kHighestUnsigned, 2147483647, 65535, true},
+     kMaxUnsigned, 2147483647, 65535, true},
     {"the double below 2 to the 64th fits", 18446744073709549568.0, 18446744073709549568.0, kHighest64,
      18446744073709549568U, 2147483647, 65535, true},
     {"2147483647.5 saturates 32 bits", 2147483647.5, 2147483647.5, 2147483647, 2147483647, 2147483647, 65535, true},
@@ -226,7 +225,7 @@ const ReadingRow kReadingRows[] = {
     {"65534.5 fits 16 bits", 65534.5, 65534.5, 65534, 65534, 65534, 65534, true},
     {"65536.0 saturates 16 bits", 65536.0, 65536.0, 65536, 65536, 65536, 65535, true},
     {"a float is cut", 2.5F, 2.5, 2, 2, 2, 2, true},
-    {"a float saturates", 1e30F, static_cast<double>(1e30F), kHighest64, kHighestUnsigned, 2147483647, 65535, true},
+    {"a float saturates", 1e30F, static_cast<double>(1e30F), kHighest64, kMaxUnsigned, 2147483647, 65535, true},
     {"a string of digits", "12", 0, 0, 0, 0, 0, false},
     {"an array", Array{12}, 0, 0, 0, 0, 0, false},
     {"a dictionary", Dictionary{{"k", 12}}, 0, 0, 0, 0, 0, false},

@@ -107,7 +107,7 @@ constexpr double kNotFinite[] = {std::numeric_limits<double>::quiet_NaN(), std::
                                  -std::numeric_limits<double>::infinity()};
 
 struct Sample {
-  RunBegan run;
+  RunStarted run;
   std::vector<DiagnosticRecord> records;
   std::optional<std::string> interrupted;
 };
@@ -170,8 +170,8 @@ class Generator {
     return error;
   }
 
-  std::vector<BoundParameter> parameters() {
-    std::vector<BoundParameter> parameters;
+  std::vector<ResolvedParameter> parameters() {
+    std::vector<ResolvedParameter> parameters;
     for (std::size_t i = upTo(3); i > 0; --i) {
       std::optional<Value> value;
       if (!oneIn(3)) value = oneIn(2) ? Value(number()) : Value(static_cast<std::int64_t>(random_()));

@@ -4,7 +4,7 @@
 #include "backends/simulated/counters/simulated_reports.h"
 #include "backends/simulated/display/simulated_framebuffer.h"
 #include "backends/simulated/hid/simulated_hid.h"
-#include "backends/simulated/scenario/capture_catalogue.h"
+#include "backends/simulated/scenario/property_table.h"
 #include "backends/simulated/scenario/sensor_operations.h"
 #include "backends/simulated/time/virtual_run_loop.h"
 #include "backends/simulated/time/virtual_services.h"
@@ -71,7 +71,7 @@ SimulatedPhone::SimulatedPhone(const Scenario& scenario, PhoneTime time, std::ui
     build(scenario, clock, std::make_shared<ThreadConcurrency>(), std::make_shared<ThreadRunLoops>(),
           sleepForEver(clock));
   } else {
-    buildVirtual(scenario, std::make_shared<VirtualScheduler>(std::make_shared<SeededChooser>(seed)));
+    buildVirtual(scenario, std::make_shared<VirtualScheduler>(std::make_shared<RandomStrategy>(seed)));
   }
 }
 

@@ -38,7 +38,7 @@ class RunLoopStress : public ::testing::Test {
 TYPED_TEST_SUITE_P(RunLoopStress);
 
 // Keeps the processor for up to `most`, so that what follows comes at no particular moment.
-inline void dawdle(std::minstd_rand& random, std::chrono::nanoseconds most) {
+inline void delay(std::minstd_rand& random, std::chrono::nanoseconds most) {
   const auto end =
       std::chrono::steady_clock::now() + std::chrono::nanoseconds(random() % static_cast<unsigned>(most.count()));
   while (std::chrono::steady_clock::now() < end) {
@@ -54,7 +54,7 @@ class StressHelper {
           for (int round = 1;; ++round) {
             begun_.wait(round - 1);
             if (begun_.load() < 0) return;
-            dawdle(random, std::chrono::microseconds(10));
+            delay(random, std::chrono::microseconds(10));
             work(round);
             ended_.store(round);
             ended_.notify_one();
@@ -144,7 +144,7 @@ TYPED_TEST_P(RunLoopStress, AStopMayEndTheThreadAndItsLoop) {
       EXPECT_EQ(loop.runInMode(TestFixture::kMode, TestFixture::kLong, false), RunLoopResult::kStopped);
     });
     running.wait(nullptr);
-    dawdle(random, std::chrono::microseconds(20));
+    delay(random, std::chrono::microseconds(20));
     running.load()->stop();
     thread.join();
   }

@@ -34,7 +34,7 @@ int SystemLog::priorityOf(LogLevel level) {
 
 void SystemLog::write(LogLevel level, std::string_view /*subsystem*/, std::string_view category,
                       std::string_view text) {
-  syslog_(priorityOf(level), std::string(category) + ": " + std::string(cut(text, kLongestText)));
+  syslog_(priorityOf(level), std::string(category) + ": " + std::string(cut(text, kMaxTextLength)));
 }
 
 }  // namespace quazor

@@ -16,7 +16,7 @@ class SystemLog final : public LogBackend {
   static constexpr char kIdentifier[] = "quazor";
   // Texts are cut to this many bytes, between characters: syslog sends one datagram for each line, and loses what does
   // not fit in it.
-  static constexpr std::size_t kLongestText = std::size_t{48} * 1024;
+  static constexpr std::size_t kMaxTextLength = std::size_t{48} * 1024;
 
   // Stands in for syslog(3) in tests. `priority` is a level of syslog(3).
   using Syslog = std::function<void(int priority, const std::string& line)>;

@@ -39,12 +39,12 @@ TEST_F(SystemLogTest, LinesHaveTheirPriorityAndCategory) {
 }
 
 TEST_F(SystemLogTest, AVeryLongTextIsCutBetweenCharacters) {
-  const std::string fits(SystemLog::kLongestText, 'a');
+  const std::string fits(SystemLog::kMaxTextLength, 'a');
   EXPECT_EQ(written(fits), fits);
-  const std::string nearly(SystemLog::kLongestText - 1, 'a');
+  const std::string nearly(SystemLog::kMaxTextLength - 1, 'a');
   EXPECT_EQ(written(nearly + "\u20AC and more"), nearly) << "three bytes, the first of which would fit";
-  EXPECT_EQ(written(std::string(SystemLog::kLongestText + 10, '\x80')),
-            std::string(SystemLog::kLongestText - 3, '\x80'))
+  EXPECT_EQ(written(std::string(SystemLog::kMaxTextLength + 10, '\x80')),
+            std::string(SystemLog::kMaxTextLength - 3, '\x80'))
       << "bytes that are no text are kept too";
 }
 

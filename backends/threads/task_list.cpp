@@ -11,7 +11,7 @@ void Backoff::pause() {
   constexpr int kYields = 16;
   ++pauses_;
   if (pauses_ <= kPolls) {
-    relaxProcessor();
+    cpuRelax();
   } else if (pauses_ <= kPolls + kYields) {
     std::this_thread::yield();
   } else {

@@ -34,7 +34,7 @@ namespace quazor {
 inline constexpr std::size_t kCacheLine = 64;
 
 // A short pause in a loop that polls memory which another thread is about to write.
-inline void relaxProcessor() {
+inline void cpuRelax() {
 #if defined(__x86_64__) || defined(__i386__)
   __builtin_ia32_pause();
 #elif defined(__aarch64__)

@@ -17,7 +17,7 @@ class ThreadWaiter final : public RunLoopWaiter {
   std::chrono::nanoseconds now() override { return std::chrono::steady_clock::now().time_since_epoch(); }
 
   void wait(std::chrono::nanoseconds deadline, const std::function<bool()>& ready) override {
-    if (watch_.lookOut(
+    if (watch_.spin(
             ready, [this] { return now(); }, deadline))
       return;
     for (;;) {

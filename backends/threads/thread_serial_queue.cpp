@@ -35,8 +35,8 @@ std::chrono::nanoseconds dueAfter(std::chrono::nanoseconds delay) {
 }
 
 void nameThisThread(const std::string& label) {
-  constexpr std::size_t kLongestName = 15;  // pthread_setname_np(3): 16 bytes with the closing null
-  const std::size_t surplus = label.size() > kLongestName ? label.size() - kLongestName : 0;
+  constexpr std::size_t kMaxNameLength = 15;  // pthread_setname_np(3): 16 bytes with the closing null
+  const std::size_t surplus = label.size() > kMaxNameLength ? label.size() - kMaxNameLength : 0;
   pthread_setname_np(pthread_self(), label.c_str() + surplus);
 }
 
@@ -86,9 +86,9 @@ class ThreadSerialQueue::Worker {
   // About five microseconds: as long as a sleep and a wake-up take.
   static constexpr int kPolls = 200;
   // So few that they cost nothing, and enough to notice that the next task comes soon again.
-  static constexpr int kFewestPolls = 10;
+  static constexpr int kMinPolls = 10;
   // Kernels tick at least 100 times a second.
-  static constexpr std::chrono::nanoseconds kLongestTick = std::chrono::milliseconds(10);
+  static constexpr std::chrono::nanoseconds kMaxTick = std::chrono::milliseconds(10);
   // Memory that was of no use for so long is given back.
   static constexpr std::chrono::nanoseconds kMemoryPeriod = std::chrono::milliseconds(100);
 
@@ -99,7 +99,7 @@ class ThreadSerialQueue::Worker {
 
   bool postDue() {
     const std::chrono::nanoseconds due = delayed_.nextDue();
-    if (due == DelayedTasks::kNever || due - coarseNow() > kLongestTick) return false;
+    if (due == DelayedTasks::kNever || due - coarseNow() > kMaxTick) return false;
     const std::chrono::nanoseconds now = steadyNow();
     return now >= delayed_.nextDue() && delayed_.postDue(now, [this](Task&& task) { push(std::move(task)); });
   }
@@ -119,13 +119,13 @@ class ThreadSerialQueue::Worker {
   // next task is far off then, or the thread that is to post it waits for this very processor.
   bool poll() {
     for (int i = 0; i < polls_; ++i) {
-      relaxProcessor();
+      cpuRelax();
       if (tasks_.front() != nullptr) {
         polls_ = kPolls;
         return true;
       }
     }
-    polls_ = std::max(kFewestPolls, polls_ / 2);
+    polls_ = std::max(kMinPolls, polls_ / 2);
     return false;
   }
 
@@ -159,7 +159,7 @@ class ThreadSerialQueue::Worker {
   DelayedTasks delayed_;
   std::atomic<bool> closed_{false};
   // The thread's own.
-  int polls_ = kFewestPolls;
+  int polls_ = kMinPolls;
   std::chrono::nanoseconds next_tidying_{};
 };
 

@@ -30,7 +30,7 @@ INSTANTIATE_TEST_SUITE_P(Qualities, ThreadSerialQueueStressTest,
                          ::testing::Values(QualityOfService::kUserInteractive, QualityOfService::kBackground), nameOf);
 
 // Keeps the processor for up to `most`, so that what follows comes at no particular moment.
-void dawdle(std::minstd_rand& random, std::chrono::nanoseconds most) {
+void delay(std::minstd_rand& random, std::chrono::nanoseconds most) {
   const auto length = std::chrono::nanoseconds(random() % static_cast<unsigned>(most.count()));
   const auto end = std::chrono::steady_clock::now() + length;
   while (std::chrono::steady_clock::now() < end) {
@@ -70,7 +70,7 @@ TEST_P(ThreadSerialQueueStressTest, NoTaskIsForgottenHoweverItsPostMeetsTheThrea
   for (int round = 0; round < 10'000; ++round) {
     queue->async([&done] { done.signal(); });
     done.wait();  // for ever, if the thread slept through it
-    dawdle(random, std::chrono::microseconds(20));
+    delay(random, std::chrono::microseconds(20));
   }
 }
 
@@ -82,7 +82,7 @@ TEST_P(ThreadSerialQueueStressTest, NoDelayIsForgottenHoweverItMeetsTheThreadFal
   for (int round = 0; round < 2'000; ++round) {
     queue->asyncAfter(std::chrono::nanoseconds(random() % 30'000), [&done] { done.signal(); });
     done.wait();
-    dawdle(random, std::chrono::microseconds(20));
+    delay(random, std::chrono::microseconds(20));
   }
 }
 
@@ -122,10 +122,10 @@ TEST_P(ThreadSerialQueueStressTest, QueuesMayGoAtAnyMomentOfTheirWork) {
     queue->asyncAfter(std::chrono::hours(1), [&undue, held] { ++undue; });
     queue->async([&ran, held] { ++ran; });
     SerialQueue& same = *queue;
-    dawdle(random, std::chrono::microseconds(50));
+    delay(random, std::chrono::microseconds(50));
     // Either the task or this thread drops the last reference.
     same.async([&ran, held, own = queue] { ++ran; });
-    dawdle(random, std::chrono::microseconds(50));
+    delay(random, std::chrono::microseconds(50));
   }
   for (int i = 0; i < 10'000 && held.use_count() > 1; ++i) std::this_thread::sleep_for(std::chrono::milliseconds(1));
   EXPECT_EQ(held.use_count(), 1);

@@ -114,20 +114,20 @@ TEST(ThreadSerialQueueTest, AnIdleQueueGivesBackTheMemoryOfItsBusiestMoment) {
 #endif
 #endif
   constexpr std::size_t kTasks = 20'000;
-  constexpr std::size_t kLeast = kTasks * sizeof(Task);
+  constexpr std::size_t kMinimum = kTasks * sizeof(Task);
   const auto inUse = [] { return ::mallinfo2().uordblks; };
   ThreadSerialQueue queue("memory", QualityOfService::kDefault);
   const std::size_t before = askThread(queue, inUse);
   ThreadSemaphore gate(0);
   queue.async([&gate] { gate.wait(); });
   for (std::size_t i = 0; i < kTasks; ++i) queue.async([] {});
-  EXPECT_GE(inUse(), before + kLeast);
+  EXPECT_GE(inUse(), before + kMinimum);
   gate.signal();
   askThread(queue, [] { return 0; });
-  for (int i = 0; i < 5000 && inUse() > before + kLeast / 10; ++i) {
+  for (int i = 0; i < 5000 && inUse() > before + kMinimum / 10; ++i) {
     std::this_thread::sleep_for(std::chrono::milliseconds(1));
   }
-  EXPECT_LE(inUse(), before + kLeast / 10);
+  EXPECT_LE(inUse(), before + kMinimum / 10);
 }
 
 TEST(ThreadSerialQueueTest, DroppingAQueueDoesNotWaitForItsTask) {

@@ -16,35 +16,35 @@ namespace quazor {
 class Watch {
  public:
   // As long as a sleep and a wake-up take.
-  static constexpr std::chrono::nanoseconds kLongest = std::chrono::microseconds(40);
+  static constexpr std::chrono::nanoseconds kMaxLength = std::chrono::microseconds(40);
 
-  // Asks `ready` again and again until it holds, kLongest has passed or `now` has reached `deadline`; or does not ask
+  // Asks `ready` again and again until it holds, kMaxLength has passed or `now` has reached `deadline`; or does not ask
   // at all. True when it held.
   template <class Ready, class Now>
-  bool lookOut(Ready&& ready, Now&& now, std::chrono::nanoseconds deadline) {
+  bool spin(Ready&& ready, Now&& now, std::chrono::nanoseconds deadline) {
     if (toLeaveOut_ > 0) {
       --toLeaveOut_;
       return false;
     }
     const std::chrono::nanoseconds begin = now();
-    const std::chrono::nanoseconds end = std::min(deadline, begin + kLongest);
+    const std::chrono::nanoseconds end = std::min(deadline, begin + kMaxLength);
     do {
       for (int i = 0; i < kLooksBetweenTimes; ++i) {
         if (ready()) {
           nextToLeaveOut_ = 1;
           return true;
         }
-        relaxProcessor();
+        cpuRelax();
       }
     } while (now() < end);
     toLeaveOut_ = nextToLeaveOut_;
-    nextToLeaveOut_ = std::min(2 * nextToLeaveOut_, kMostToLeaveOut);
+    nextToLeaveOut_ = std::min(2 * nextToLeaveOut_, kMaxToLeaveOut);
     return false;
   }
 
  private:
   static constexpr int kLooksBetweenTimes = 16;
-  static constexpr int kMostToLeaveOut = 1024;
+  static constexpr int kMaxToLeaveOut = 1024;
 
   int toLeaveOut_ = 0;
   int nextToLeaveOut_ = 1;

@@ -18,7 +18,7 @@ class WatchTest : public testing::Test {
   // True when the watch asked at least once; `ready` is what it got as an answer.
   bool looks(bool ready, std::chrono::nanoseconds deadline = kNever) {
     bool asked = false;
-    succeeded_ = watch_.lookOut(
+    succeeded_ = watch_.spin(
         [&] {
           asked = true;
           return ready;
@@ -46,13 +46,13 @@ TEST_F(WatchTest, SeesAtOnceWhatIsReady) {
 }
 
 TEST_F(WatchTest, SeesWhatBecomesReadyMeanwhile) {
-  EXPECT_TRUE(watch_.lookOut([this] { return now_ >= 30us; }, [this] { return now_ += 10us; }, kNever));
+  EXPECT_TRUE(watch_.spin([this] { return now_ >= 30us; }, [this] { return now_ += 10us; }, kNever));
 }
 
 TEST_F(WatchTest, EndsAfterItsLongestTime) {
   EXPECT_TRUE(looks(false));
   EXPECT_FALSE(succeeded_);
-  EXPECT_EQ(now_, 10us + Watch::kLongest);
+  EXPECT_EQ(now_, 10us + Watch::kMaxLength);
 }
 
 TEST_F(WatchTest, EndsAtTheDeadline) {

@@ -16,9 +16,9 @@ namespace {
 
 using Json = nlohmann::ordered_json;
 
-constexpr std::size_t kLargestFile = 16U << 20;  // a device may have no end
+constexpr std::size_t kMaxFile = 16U << 20;  // a device may have no end
 // Deeper than any document. Bounds the recursion of whoever walks the document.
-constexpr std::size_t kDeepest = 32;
+constexpr std::size_t kMaxDepth = 32;
 
 // The length of the UTF-8 sequence at the start of `text`; 0 when it is none (RFC 3629).
 std::size_t sequenceLength(std::string_view text) {
@@ -141,9 +141,9 @@ class Tracker {
   }
   void open(bool isArray) {
     element();
-    if (open_.size() == kDeepest) {
+    if (open_.size() == kMaxDepth) {
       throw JsonProblem(name_ + ":" + std::to_string(line()) + ": the document is nested more than " +
-                        std::to_string(kDeepest) + " deep.");
+                        std::to_string(kMaxDepth) + " deep.");
     }
     open_.push_back({isArray, 0, {}, {}});
   }
@@ -212,7 +212,7 @@ std::string readTextFile(const std::filesystem::path& file) {
   std::array<char, 65536> piece;  // read() notes a failure where iterators throw
   while (stream.read(piece.data(), piece.size()) || stream.gcount() > 0) {
     text.append(piece.data(), static_cast<std::size_t>(stream.gcount()));
-    if (text.size() > kLargestFile) throw JsonProblem(name + ": the file is larger than 16 MiB.");
+    if (text.size() > kMaxFile) throw JsonProblem(name + ": the file is larger than 16 MiB.");
   }
   if (stream.bad()) throw JsonProblem(name + ": the file cannot be read.");
   return text;

@@ -17,9 +17,9 @@
 namespace quazor {
 namespace {
 
-ReportChannelTraits channel(std::string group, std::string subGroup, std::string name,
+ReportChannelConfig channel(std::string group, std::string subGroup, std::string name,
                             std::optional<std::uint64_t> count) {
-  ReportChannelTraits channel;
+  ReportChannelConfig channel;
   channel.group = std::move(group);
   channel.subGroup = std::move(subGroup);
   channel.name = std::move(name);
@@ -27,7 +27,7 @@ ReportChannelTraits channel(std::string group, std::string subGroup, std::string
   return channel;
 }
 
-Scenario scenarioOf(std::vector<ReportChannelTraits> channels) {
+Scenario scenarioOf(std::vector<ReportChannelConfig> channels) {
   Scenario scenario;
   scenario.title = "A phone with report channels";
   scenario.reports = std::move(channels);
@@ -35,7 +35,7 @@ Scenario scenarioOf(std::vector<ReportChannelTraits> channels) {
 }
 
 // Six channels, of which the presence report has the first three.
-std::vector<ReportChannelTraits> sixChannels() {
+std::vector<ReportChannelConfig> sixChannels() {
   return {channel("K42ISP", "K42ISP Events", "Number Fenk NTC", 3),
           channel("The K42ISP of old", "K42ISP Events of old", "Number ZE FAULT_A", 0),
           channel("K42ISP", "All K42ISP Events", "Number KT EN_PIN_STATE", 18446744073709549568U),
@@ -138,7 +138,7 @@ error QZTelemonErrorDomain code 100: Could not sample the report.)") +
 }
 
 TEST(TesselTelemonRun, FailsAtTheFirstChannelWithoutACount) {
-  std::vector<ReportChannelTraits> channels = sixChannels();
+  std::vector<ReportChannelConfig> channels = sixChannels();
   const std::string told = R"(ReportFacility reportWithOnlySimpleChannels
 ReportChannelSet reportByFilteringChannels 3
 ReportChannelSet snapshot
@@ -154,7 +154,7 @@ error QZTelemonErrorDomain code 100: Could not get the count of )";
 }
 
 TEST(TesselTelemonRun, LeavesChannelsOutsideTheReportWithoutACountAlone) {
-  std::vector<ReportChannelTraits> channels = sixChannels();
+  std::vector<ReportChannelConfig> channels = sixChannels();
   for (std::size_t i = 3; i < channels.size(); ++i) channels[i].count = std::nullopt;
   expectTold(R"(ReportFacility reportWithOnlySimpleChannels
 ReportChannelSet reportByFilteringChannels 3

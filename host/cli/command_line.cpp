@@ -46,7 +46,7 @@ constexpr const char* kExitCodes = R"(Exit codes:
 
 // What a plug-in's process may have by default: more than any diagnostic needs, less than a bench's machine has.
 constexpr std::uint64_t kMebibyte = 1024 * 1024;
-constexpr std::uint64_t kUsualMebibytes = 4096;
+constexpr std::uint64_t kDefaultMebibytes = 4096;
 
 // The texts of a command line as CLI11 collects them, before they are checked.
 struct RawOptions {
@@ -183,8 +183,8 @@ std::uint64_t parseWhole(const char* option, const std::string& text, std::uint6
   std::uint64_t number = 0;
   const auto [end, error] = std::from_chars(text.data(), text.data() + text.size(), number);
   if (error != std::errc() || end != text.data() + text.size() || number < least || number > most) {
-    throw Refusal(ExitCode::kUsage, std::string(option) + " '" + text + "': it must be a whole number from " +
-                                        std::to_string(least) + " to " + std::to_string(most));
+    throw CommandError(ExitCode::kUsage, std::string(option) + " '" + text + "': it must be a whole number from " +
+                                             std::to_string(least) + " to " + std::to_string(most));
   }
   return number;
 }
@@ -195,7 +195,7 @@ std::optional<std::uint64_t> memoryOf(const std::string& text) {
 #if defined(__SANITIZE_ADDRESS__) || defined(__SANITIZE_THREAD__)
   return std::nullopt;  // the sanitizers' shadow takes more than there is
 #else
-  return kUsualMebibytes * kMebibyte;
+  return kDefaultMebibytes * kMebibyte;
 #endif
 }
 
@@ -212,7 +212,7 @@ void refuseEmpty(const CLI::App& command, const char* option) {
   if (given == nullptr) return;
   const std::vector<std::string>& texts = given->results();
   if (std::find(texts.begin(), texts.end(), std::string()) == texts.end()) return;
-  throw Refusal(ExitCode::kUsage, std::string(option) + ": its value is empty");
+  throw CommandError(ExitCode::kUsage, std::string(option) + ": its value is empty");
 }
 
 Command commandOf(const std::string& name) {
@@ -226,16 +226,17 @@ ReportOptions reportOf(const RawOptions& raw, bool isOfRun) {
   report.format = *formatNamed(raw.format);
   for (const std::string& text : raw.outputs) {
     OutputRequest output = isOfRun ? parseOutput(text, report.format) : OutputRequest{report.format, text};
-    if (output.file.empty()) throw Refusal(ExitCode::kUsage, "--output '" + text + "': the file's name is missing");
+    if (output.file.empty())
+      throw CommandError(ExitCode::kUsage, "--output '" + text + "': the file's name is missing");
     if (output.file != text) {
       report.outputs.push_back(std::move(output));
     } else if (report.output.empty()) {
       report.output = output.file;
     } else {
-      throw Refusal(ExitCode::kUsage,
-                    "--output '" + report.output.string() + "' and --output '" + text +
-                        (isOfRun ? "': write the format before further files, as in --output junit:FILE"
-                                 : "': one file is all that is written"));
+      throw CommandError(ExitCode::kUsage,
+                         "--output '" + report.output.string() + "' and --output '" + text +
+                             (isOfRun ? "': write the format before further files, as in --output junit:FILE"
+                                      : "': one file is all that is written"));
     }
   }
   return report;
@@ -245,11 +246,11 @@ ReportOptions reportOf(const RawOptions& raw, bool isOfRun) {
 void checkPhone(const CLI::App& command, const std::filesystem::path& phone) {
   const std::optional<std::filesystem::path> binding = bindingNamed(phone);
   if (!binding) return;
-  if (binding->empty()) throw Refusal(ExitCode::kUsage, "--phone 'linux:': the binding's file or name is missing");
+  if (binding->empty()) throw CommandError(ExitCode::kUsage, "--phone 'linux:': the binding's file or name is missing");
   for (const char* option : {"--seed", "--realtime"}) {
     if (command.get_option(option)->count() == 0) continue;
-    throw Refusal(ExitCode::kUsage, std::string(option) + " is for simulated phones; --phone '" + phone.string() +
-                                        "' is this machine, in real time, in the order in which things happen");
+    throw CommandError(ExitCode::kUsage, std::string(option) + " is for simulated phones; --phone '" + phone.string() +
+                                             "' is this machine, in real time, in the order in which things happen");
   }
 }
 
@@ -257,12 +258,14 @@ void checkPhone(const CLI::App& command, const std::filesystem::path& phone) {
 void checkNames(const Options& options, const std::string& what) {
   const int ways = (options.names.empty() ? 0 : 1) + (options.all ? 1 : 0) + (options.onlyFailed ? 1 : 0);
   if (ways == 0) {
-    throw Refusal(ExitCode::kUsage, "name the " + what + " to run, or give --all; 'quazor list' shows what there is");
+    throw CommandError(ExitCode::kUsage,
+                       "name the " + what + " to run, or give --all; 'quazor list' shows what there is");
   }
-  if (ways > 1 && !options.onlyFailed) throw Refusal(ExitCode::kUsage, "give either names of " + what + " or --all");
-  if (ways > 1) throw Refusal(ExitCode::kUsage, "give --only failed without names and without --all");
+  if (ways > 1 && !options.onlyFailed)
+    throw CommandError(ExitCode::kUsage, "give either names of " + what + " or --all");
+  if (ways > 1) throw CommandError(ExitCode::kUsage, "give --only failed without names and without --all");
   if (!options.onlyFailed && !options.failedOf.empty()) {
-    throw Refusal(ExitCode::kUsage, "--of is for --only failed");
+    throw CommandError(ExitCode::kUsage, "--of is for --only failed");
   }
 }
 
@@ -288,7 +291,7 @@ Options optionsOf(const CLI::App& command, const RawOptions& raw) {
   options.seed = parseWhole("--seed", raw.seed, 0, UINT64_MAX);
   options.seeds = parseWhole("--seeds", raw.seeds, 1, 1'000'000);
   options.memory = memoryOf(raw.memory);
-  for (const std::string& text : raw.settings) options.settings.push_back(parseSetting(text));
+  for (const std::string& text : raw.settings) options.settings.push_back(parseOverride(text));
   for (const std::string& text : raw.deadlines) options.deadlines.push_back(parseDeadline(text));
   options.logLevel = logLevelOf(raw.logLevel);
   options.systemLog = raw.systemLog;
@@ -313,8 +316,8 @@ void refuseUnknownCommand(const std::vector<std::string>& arguments) {
   if (std::find(commands.begin(), commands.end(), word) != commands.end()) return;
   std::string list;
   for (const std::string& command : commands) list += (list.empty() ? "" : ", ") + command;
-  throw Refusal(ExitCode::kUsage,
-                "there is no command '" + word + "'" + didYouMean(word, commands) + "; the commands are " + list);
+  throw CommandError(ExitCode::kUsage,
+                     "there is no command '" + word + "'" + didYouMean(word, commands) + "; the commands are " + list);
 }
 
 void declareLookingCommands(CLI::App& app, RawOptions& raw) {
@@ -436,7 +439,7 @@ std::optional<Options> parseCommandLine(const std::vector<std::string>& argument
   } catch (const CLI::ParseError& refusal) {
     err << "quazor: " << printable(refusal.what()) << "\nquazor --help shows how to call it.\n";
     *code = ExitCode::kUsage;
-  } catch (const Refusal& refusal) {
+  } catch (const CommandError& refusal) {
     err << "quazor: " << printable(refusal.what()) << '\n';
     *code = refusal.code();
   }

@@ -42,7 +42,7 @@ inline constexpr std::string_view kCommandNames[] = {"list",   "describe", "run"
 struct Options {
   std::vector<std::string> names;  // of diagnostics and experiments; what is to be explained; a shell; probe
   std::vector<std::filesystem::path> plugins;  // none: the installed one
-  std::vector<Setting> settings;
+  std::vector<ParameterOverride> settings;
   std::vector<std::filesystem::path> parameterFiles;
   std::vector<std::filesystem::path> records;  // to be read
   std::filesystem::path record;                // to be written; empty: none

@@ -4,16 +4,16 @@
 
 namespace quazor {
 
-void writeAnswer(const ReportOptions& report, Console& console, const std::string& answer) {
+void writeOutput(const ReportOptions& report, Console& console, const std::string& answer) {
   if (report.output.empty()) {
     console.out << answer << std::flush;
-    if (!console.out) throw Refusal(ExitCode::kCannotWrite, "the standard output cannot be written");
+    if (!console.out) throw CommandError(ExitCode::kCannotWrite, "the standard output cannot be written");
     return;
   }
   const std::string problem = writeOutputFile(report.output, answer);
   if (problem.empty()) return;
-  throw Refusal(ExitCode::kCannotWrite,
-                "the output file '" + report.output.string() + "' cannot be written: " + problem);
+  throw CommandError(ExitCode::kCannotWrite,
+                     "the output file '" + report.output.string() + "' cannot be written: " + problem);
 }
 
 }  // namespace quazor

@@ -7,7 +7,7 @@
 
 namespace quazor {
 
-// Writes it to the output file, or else to the console. Throws a Refusal (kCannotWrite) when that fails.
-void writeAnswer(const ReportOptions& report, Console& console, const std::string& answer);
+// Writes it to the output file, or else to the console. Throws a CommandError (kCannotWrite) when that fails.
+void writeOutput(const ReportOptions& report, Console& console, const std::string& answer);
 
 }  // namespace quazor

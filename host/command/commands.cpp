@@ -9,7 +9,7 @@
 #include "host/command/run_command.h"
 #include "host/command/selection.h"
 #include "host/command/selftest_command.h"
-#include "host/plugin/catalogue.h"
+#include "host/plugin/diagnostic_registry.h"
 #include "host/record/value_json.h"
 #include "host/report/json_report.h"
 #include "host/report/text_report.h"
@@ -23,7 +23,7 @@ namespace quazor {
 namespace {
 
 // Tells of the plug-ins that could not be loaded, and what that makes of the exit code.
-ExitCode tellFailed(const std::vector<FailedPlugin>& failed, Console& console, ExitCode otherwise) {
+ExitCode reportFailed(const std::vector<FailedPlugin>& failed, Console& console, ExitCode otherwise) {
   for (const FailedPlugin& plugin : failed) {
     console.err << "quazor: " << printable(plugin.error->localizedDescription()) << '\n';
   }
@@ -36,7 +36,7 @@ ExitCode list(const Options& options, const Installation& installation, Console&
     std::erase_if(all, [](const Diagnostic& one) { return !one.experimentOnly || !one.usedBy.empty(); });
     return all;
   };
-  const Survey survey = surveyOf(options, installation, lonely);
+  const PluginScan survey = surveyOf(options, installation, lonely);
   std::vector<DescribedDiagnostic> listed;
   for (const DescribedDiagnostic& one : survey.catalogue) {
     if (one.diagnostic.usedBy.empty()) listed.push_back(one);
@@ -47,8 +47,8 @@ ExitCode list(const Options& options, const Installation& installation, Console&
   } else {
     printList(text, listed);
   }
-  writeAnswer(options.report, console, text.str());
-  return tellFailed(survey.failed, console, ExitCode::kAllPassed);
+  writeOutput(options.report, console, text.str());
+  return reportFailed(survey.failed, console, ExitCode::kAllPassed);
 }
 
 ExitCode describe(const Options& options, const Installation& installation, Console& console) {
@@ -59,18 +59,18 @@ ExitCode describe(const Options& options, const Installation& installation, Cons
   } else {
     printDescriptions(text, selection.diagnostics);
   }
-  writeAnswer(options.report, console, text.str());
+  writeOutput(options.report, console, text.str());
   ExitCode code = ExitCode::kAllPassed;
-  for (const BoundDiagnostic& one : selection.diagnostics) {
+  for (const ResolvedDiagnostic& one : selection.diagnostics) {
     if (one.described.description.error != nullptr) code = ExitCode::kError;
   }
-  return tellFailed(selection.failed, console, code);
+  return reportFailed(selection.failed, console, code);
 }
 
 ExitCode explainErrors(const Options& options, const Installation& installation, Console& console) {
   std::ostringstream text;
   explain(options.names, installation.explanations(), options.report.format == Format::kJson, text);
-  writeAnswer(options.report, console, text.str());
+  writeOutput(options.report, console, text.str());
   return ExitCode::kAllPassed;
 }
 
@@ -107,7 +107,7 @@ ExitCode runProgram(const std::vector<std::string>& arguments, const Installatio
   if (!options) return code;
   try {
     return perform(*options, installation, console);
-  } catch (const Refusal& refusal) {
+  } catch (const CommandError& refusal) {
     console.err << "quazor: " << printable(refusal.what()) << '\n';
     return refusal.code();
   }

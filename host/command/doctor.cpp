@@ -5,7 +5,7 @@
 #include "host/command/selection.h"
 #include "host/device/phone.h"
 #include "host/plugin/profile.h"
-#include "host/record/last_run.h"
+#include "host/record/previous_run.h"
 #include "host/text/table.h"
 
 #include <algorithm>
@@ -47,11 +47,11 @@ class Doctor {
   }
 
  private:
-  // `look` returns what there is, or throws the Refusal that says what is wrong.
+  // `look` returns what there is, or throws the CommandError that says what is wrong.
   void check(std::string_view kind, const std::string& name, const std::function<std::string()>& look) {
     try {
       tell(true, kind, name, look());
-    } catch (const Refusal& refusal) {
+    } catch (const CommandError& refusal) {
       tell(false, kind, name, refusal.what());
     }
   }
@@ -66,15 +66,15 @@ class Doctor {
   std::string findingOfPlugin(const std::filesystem::path& plugin) const {
     Options alone = options_;
     alone.plugins = {plugin};
-    const Survey survey = surveyOf(alone, installation_, [](const std::vector<Diagnostic>& all) { return all; });
+    const PluginScan survey = surveyOf(alone, installation_, [](const std::vector<Diagnostic>& all) { return all; });
     if (!survey.failed.empty()) {
-      throw Refusal(ExitCode::kCannotRead, survey.failed.front().error->localizedDescription());
+      throw CommandError(ExitCode::kCannotRead, survey.failed.front().error->localizedDescription());
     }
     std::size_t diagnostics = 0;
     for (const DescribedDiagnostic& one : survey.catalogue) {
       if (one.description.error != nullptr) {
-        throw Refusal(ExitCode::kCannotRead,
-                      one.diagnostic.name + " cannot be described: " + one.description.error->localizedDescription());
+        throw CommandError(ExitCode::kCannotRead, one.diagnostic.name + " cannot be described: " +
+                                                      one.description.error->localizedDescription());
       }
       if (!one.diagnostic.experimentOnly) ++diagnostics;
     }
@@ -90,7 +90,7 @@ class Doctor {
     for (const std::string& name : names) {
       try {
         summaryOfScenario(installation_.scenario(name));
-      } catch (const Refusal& refusal) {
+      } catch (const CommandError& refusal) {
         tell(false, "phone", name, refusal.what());
       }
     }
@@ -108,21 +108,21 @@ class Doctor {
     for (const std::string& name : names) {
       try {
         phonesOfBinding(installation_.binding(name));
-      } catch (const Refusal& refusal) {
+      } catch (const CommandError& refusal) {
         tell(false, "binding", name, refusal.what());
       }
     }
   }
 
   void checkLastRun() {
-    const std::filesystem::path file = lastRunFile();
+    const std::filesystem::path file = previousRunFile();
     if (file.empty()) {
       tell(true, "last run", "-", "not kept: neither XDG_STATE_HOME nor HOME is set");
     } else if (!std::filesystem::exists(file)) {
       tell(true, "last run", file.string(), "there was none");
     } else {
       check("last run", file.string(),
-            [&] { return countText(namesNotPassed(runIn(file)).size(), "diagnostic") + " did not pass"; });
+            [&] { return countText(failedNames(runIn(file)).size(), "diagnostic") + " did not pass"; });
     }
   }
 

@@ -136,13 +136,13 @@ TEST_F(Explain, WritesOneJsonDocument) {
 
 TEST_F(Explain, WritesNothingWhenOneOfTheNamesHasNoExplanation) {
   std::ostringstream out;
-  EXPECT_THROW(explain({"Light", "Lihgt"}, directory_.path(), false, out), Refusal);
+  EXPECT_THROW(explain({"Light", "Lihgt"}, directory_.path(), false, out), CommandError);
   EXPECT_EQ(out.str(), "");
 }
 
 TEST(ExplainWithoutExplanations, IsRefused) {
   std::ostringstream out;
-  EXPECT_THROW(explain({}, "/nowhere", false, out), Refusal);
+  EXPECT_THROW(explain({}, "/nowhere", false, out), CommandError);
 }
 
 }  // namespace

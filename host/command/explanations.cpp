@@ -4,7 +4,7 @@
 #include "base/text/nearest_name.h"
 #include "contract/message_format.h"
 #include "host/error/exit_code.h"
-#include "host/plugin/catalogue.h"
+#include "host/plugin/diagnostic_registry.h"
 
 #include <algorithm>
 #include <array>
@@ -22,7 +22,7 @@ constexpr std::uint64_t kSchema = 1;
 constexpr std::array<std::string_view, 4> kKinds{"diagnostic", "experiment", "analysis", "result"};
 
 [[noreturn]] void refuse(const std::string& file, const std::string& what) {
-  throw Refusal(ExitCode::kCannotRead, "the explanations in '" + file + "' cannot be used: " + what);
+  throw CommandError(ExitCode::kCannotRead, "the explanations in '" + file + "' cannot be used: " + what);
 }
 
 std::string lineOf(const JsonCursor& cursor) {
@@ -133,7 +133,7 @@ std::vector<Explanation> reading(const std::string& file, const Read& read) {
   try {
     document = read();
   } catch (const JsonProblem& problem) {  // it names the file
-    throw Refusal(ExitCode::kCannotRead, problem.what());
+    throw CommandError(ExitCode::kCannotRead, problem.what());
   }
   try {
     return explanationsOf(JsonCursor(document));
@@ -198,14 +198,14 @@ std::string nearestDomain(const std::vector<Explanation>& explanations, const st
     if (one.isError() && one.domain == key.domain) codes += (codes.empty() ? "" : ", ") + std::to_string(one.code);
   }
   if (!codes.empty()) {
-    throw Refusal(ExitCode::kUsage,
-                  formatMessage("no explanation of code %@ in '%@'; it has %@", key.code, key.domain, codes));
+    throw CommandError(ExitCode::kUsage,
+                       formatMessage("no explanation of code %@ in '%@'; it has %@", key.code, key.domain, codes));
   }
   const std::string nearest = nearestDomain(explanations, key.domain);
-  throw Refusal(ExitCode::kUsage,
-                formatMessage("no explanation of the error domain '%@'; %@", key.domain,
-                              nearest.empty() ? "where the report says 'caused by', ask for the error above it"
-                                              : "did you mean '" + nearest + "'?"));
+  throw CommandError(ExitCode::kUsage,
+                     formatMessage("no explanation of the error domain '%@'; %@", key.domain,
+                                   nearest.empty() ? "where the report says 'caused by', ask for the error above it"
+                                                   : "did you mean '" + nearest + "'?"));
 }
 
 [[noreturn]] void refuseName(const std::vector<Explanation>& explanations, const std::string& asked) {
@@ -216,8 +216,9 @@ std::string nearestDomain(const std::vector<Explanation>& explanations, const st
     if (one.isError()) known.push_back(one.domain);
   }
   const std::string nearest = didYouMean(asked, known);
-  throw Refusal(ExitCode::kUsage, formatMessage("no explanation of '%@'%@", asked,
-                                                nearest.empty() ? "; 'quazor explain' lists what there is" : nearest));
+  throw CommandError(ExitCode::kUsage,
+                     formatMessage("no explanation of '%@'%@", asked,
+                                   nearest.empty() ? "; 'quazor explain' lists what there is" : nearest));
 }
 
 }  // namespace
@@ -256,7 +257,7 @@ std::vector<const Explanation*> findExplanations(const std::vector<Explanation>&
   }
   if (const std::optional<std::int64_t> code = integerOf(asked)) {
     found = thoseThat(explanations, [&](const Explanation& one) { return one.isError() && one.code == *code; });
-    if (found.empty()) throw Refusal(ExitCode::kUsage, "no error domain has an explanation of code " + asked);
+    if (found.empty()) throw CommandError(ExitCode::kUsage, "no error domain has an explanation of code " + asked);
     return found;
   }
   found = thoseThat(explanations, [&](const Explanation& one) {

@@ -40,17 +40,18 @@ struct Explanation {
 // "DOMAIN:CODE", by which an error is asked for.
 std::string keyOf(std::string_view domain, std::int64_t code);
 
-// What is in one file. Throws a Refusal (kCannotRead) with one sentence that names the file and the place when the text
-// is not exactly of the form that is known.
+// What is in one file. Throws a CommandError (kCannotRead) with one sentence that names the file and the place when the
+// text is not exactly of the form that is known.
 std::vector<Explanation> parseExplanations(const std::string& file, std::string_view text);
 
-// What is in a directory's files NAME.json but NAME.schema.json, in the order of the files' names. Throws a Refusal
-// (kCannotRead) for what cannot be read, for a directory without explanations, and for two explanations of one thing.
+// What is in a directory's files NAME.json but NAME.schema.json, in the order of the files' names. Throws a
+// CommandError (kCannotRead) for what cannot be read, for a directory without explanations, and for two explanations of
+// one thing.
 std::vector<Explanation> readExplanations(const std::filesystem::path& directory);
 
 // The explanations that `asked` stands for, in their order: DOMAIN:CODE, a code that one or several domains have, a
-// domain, a name or a pattern of names (*, ?, [...]), or a code's name in the source. Throws a Refusal (kUsage), with
-// the nearest name that there is, when it stands for none.
+// domain, a name or a pattern of names (*, ?, [...]), or a code's name in the source. Throws a CommandError (kUsage),
+// with the nearest name that there is, when it stands for none.
 std::vector<const Explanation*> findExplanations(const std::vector<Explanation>& explanations,
                                                  const std::string& asked);
 

@@ -51,7 +51,7 @@ std::string with(std::string text, const std::string& old, const std::string& re
 std::string refusalOf(ExitCode code, const std::function<void()>& call) {
   try {
     call();
-  } catch (const Refusal& refusal) {
+  } catch (const CommandError& refusal) {
     EXPECT_EQ(refusal.code(), code);
     return refusal.what();
   }

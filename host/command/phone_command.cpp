@@ -13,7 +13,7 @@ ExitCode phoneCommand(const Options& options, Console& console) {
     console.out
         << "\nA binding to start from: save it, say which camera is which, and give it with --phone linux:FILE.\n\n";
   }
-  writeAnswer(options.report, console, probe.binding);
+  writeOutput(options.report, console, probe.binding);
   if (!options.report.output.empty()) {
     console.out << "\nA binding to start from is in " << printable(options.report.output.string())
                 << ": say there which camera is which, and give it with --phone linux:FILE.\n";

@@ -7,7 +7,7 @@
 namespace quazor {
 
 // Prints what there is, why each fits or not, and a binding to start from, or writes that to the output file. What is
-// missing is no failure: kAllPassed. Throws a Refusal (kCannotWrite) when the file cannot be written.
+// missing is no failure: kAllPassed. Throws a CommandError (kCannotWrite) when the file cannot be written.
 ExitCode phoneCommand(const Options& options, Console& console);
 
 }  // namespace quazor

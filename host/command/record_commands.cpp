@@ -29,7 +29,7 @@ ExitCode verifyCommand(const Options& options, Console& console) {
     answer << "The run did not come to its end"
            << (stored.cutOff ? ", and the record's last line is cut off.\n" : ".\n");
   }
-  writeAnswer(options.report, console, answer.str());
+  writeOutput(options.report, console, answer.str());
   return problems.empty() ? ExitCode::kAllPassed : ExitCode::kFailed;
 }
 
@@ -40,7 +40,7 @@ ExitCode diffCommand(const Options& options, Console& console) {
   std::ostringstream answer;
   for (const std::string& one : differences) answer << printable(one) << '\n';
   if (differences.empty()) answer << "The records tell the same.\n";
-  writeAnswer(options.report, console, answer.str());
+  writeOutput(options.report, console, answer.str());
   return differences.empty() ? ExitCode::kAllPassed : ExitCode::kFailed;
 }
 

@@ -77,16 +77,16 @@ TEST_F(RecordCommandsTest, DiffTellsWhatIsDifferent) {
   const std::filesystem::path whole = record("a", events);
   EXPECT_EQ(diff(whole, whole), ExitCode::kAllPassed);
   EXPECT_EQ(out_.str(), "The records tell the same.\n");
-  std::get<DiagnosticBegan>(events[1]).name = "Go\nod";
+  std::get<DiagnosticStarted>(events[1]).name = "Go\nod";
   EXPECT_EQ(diff(whole, record("b", events)), ExitCode::kFailed);
   EXPECT_EQ(out_.str(), "Good is only in the first\nGo\\x0aod is only in the second\n");
 }
 
 TEST_F(RecordCommandsTest, NeedRecords) {
   const std::filesystem::path whole = record("a", wholeRun());
-  EXPECT_THROW(verify(directory_.path() / "nothing"), Refusal);
-  EXPECT_THROW(diff(whole, directory_.path() / "nothing"), Refusal);
-  EXPECT_THROW(diff(directory_.path() / "nothing", whole), Refusal);
+  EXPECT_THROW(verify(directory_.path() / "nothing"), CommandError);
+  EXPECT_THROW(diff(whole, directory_.path() / "nothing"), CommandError);
+  EXPECT_THROW(diff(directory_.path() / "nothing", whole), CommandError);
 }
 
 TEST_F(RecordCommandsTest, TellWhenTheStandardOutputCannotBeWritten) {
@@ -96,7 +96,7 @@ TEST_F(RecordCommandsTest, TellWhenTheStandardOutputCannotBeWritten) {
     try {
       action();
       ADD_FAILURE() << "it went well";
-    } catch (const Refusal& refusal) {
+    } catch (const CommandError& refusal) {
       EXPECT_EQ(refusal.code(), ExitCode::kCannotWrite);
       EXPECT_THAT(refusal.what(), HasSubstr("the standard output cannot be written"));
     }

@@ -1,12 +1,12 @@
 #include "host/command/run_command.h"
 
 #include "contract/contract.h"
-#include "host/command/rerun.h"
+#include "host/command/failed_only.h"
 #include "host/command/selection.h"
 #include "host/device/phone.h"
 #include "host/error/host_error.h"
+#include "host/run/event_pipeline.h"
 #include "host/run/isolation.h"
-#include "host/run/run_events.h"
 #include "host/system/interrupt_watcher.h"
 #include "host/system/output_file.h"
 #include "host/text/table.h"
@@ -24,7 +24,7 @@ namespace {
 
 // What is to be done for each diagnostic.
 struct Job {
-  BoundDiagnostic bound;
+  ResolvedDiagnostic bound;
   const QZExperimentResult* result = nullptr;  // to be analysed; null: the experiment is run
   std::uint64_t seed = 0;
 };
@@ -32,7 +32,7 @@ struct Job {
 // Does the jobs, one after the other, each in a process of its own or all in this one.
 class Conductor {
  public:
-  Conductor(IsolationOptions isolation, const Options& options, RunOptions runOptions, RunEvents& events)
+  Conductor(IsolationOptions isolation, const Options& options, RunOptions runOptions, EventPipeline& events)
       : isolation_(std::move(isolation)),
         runOptions_(std::move(runOptions)),
         inProcess_(options.inProcess),
@@ -43,9 +43,9 @@ class Conductor {
   // What the user interrupted, as RunEnded has it; nothing when the run goes on.
   std::optional<std::string> perform(const Job& job) {
     const auto& [diagnostic, description] = job.bound.described;
-    events_.take(DiagnosticBegan{diagnostic.name, job.bound.described.summary(), diagnostic.experimentName,
-                                 diagnostic.analysisName, diagnostic.experimentOnly, job.bound.parameters, job.seed,
-                                 dateNow()});
+    events_.take(DiagnosticStarted{diagnostic.name, job.bound.described.summary(), diagnostic.experimentName,
+                                   diagnostic.analysisName, diagnostic.experimentOnly, job.bound.parameters, job.seed,
+                                   dateNow()});
     std::optional<std::string> interrupted;
     if (description.error != nullptr) {
       events_.take(Failed{Stage::kDescribe, description.error});
@@ -74,21 +74,21 @@ class Conductor {
   const IsolationOptions isolation_;
   const RunOptions runOptions_;
   const bool inProcess_;
-  RunEvents& events_;
+  EventPipeline& events_;
   std::optional<WatchedSignals> signals_;
 };
 
 // A plug-in that could not be loaded stands in the report like a diagnostic.
-void tellFailedPlugin(const FailedPlugin& plugin, RunEvents& events) {
-  events.take(DiagnosticBegan{
+void tellFailedPlugin(const FailedPlugin& plugin, EventPipeline& events) {
+  events.take(DiagnosticStarted{
       plugin.file.filename().string(), "A plug-in that could not be loaded.", {}, {}, false, {}, 0, dateNow()});
   events.take(Failed{Stage::kLoad, plugin.error});
   events.endDiagnostic();
 }
 
-RunBegan beginningOf(const Options& options, const Installation& installation, const std::vector<Job>& jobs,
-                     const std::vector<FailedPlugin>& failed) {
-  RunBegan began{QUAZOR_VERSION, QUAZOR_CONTRACT_VERSION, dateNow(), {}, {}, options.seed, false, {}};
+RunStarted beginningOf(const Options& options, const Installation& installation, const std::vector<Job>& jobs,
+                       const std::vector<FailedPlugin>& failed) {
+  RunStarted began{QUAZOR_VERSION, QUAZOR_CONTRACT_VERSION, dateNow(), {}, {}, options.seed, false, {}};
   for (const auto& file : isolationOf(options, installation).plugins) began.plugins.push_back(file.string());
   began.ofExperiments = options.command == Command::kExperiment;
   for (const FailedPlugin& plugin : failed) began.names.push_back(plugin.file.filename().string());
@@ -105,13 +105,13 @@ void checkOutputs(const Options& options) {
       return;
     const std::filesystem::path target = std::filesystem::weakly_canonical(std::filesystem::absolute(file), error);
     if (std::find(regular.begin(), regular.end(), target) != regular.end()) {
-      throw Refusal(ExitCode::kUsage, "the file '" + file.string() + "' is to be written twice");
+      throw CommandError(ExitCode::kUsage, "the file '" + file.string() + "' is to be written twice");
     }
     regular.push_back(target);
   };
   const auto checkReport = [&check](const std::filesystem::path& file) {
     if (const std::string why = problemOfOutputFile(file); !why.empty()) {
-      throw Refusal(ExitCode::kCannotWrite, "the output file '" + file.string() + "' cannot be written: " + why);
+      throw CommandError(ExitCode::kCannotWrite, "the output file '" + file.string() + "' cannot be written: " + why);
     }
     check(file);
   };
@@ -120,14 +120,14 @@ void checkOutputs(const Options& options) {
   for (const OutputRequest& output : options.report.outputs) checkReport(output.file);
 }
 
-RunEventOptions eventOptions(const Options& options, bool keepsLastRun) {
+EventPipelineOptions eventOptions(const Options& options, bool keepsLastRun) {
   return {options.record, keepsLastRun, options.systemLog, options.report};
 }
 
-ExitCode perform(const Options& options, const Installation& installation, Console& console, RunBegan began,
+ExitCode perform(const Options& options, const Installation& installation, Console& console, RunStarted began,
                  const std::vector<Job>& jobs, const std::vector<FailedPlugin>& failed, const RunOptions& runOptions) {
   checkOutputs(options);
-  RunEvents events(eventOptions(options, options.command == Command::kRun), console);
+  EventPipeline events(eventOptions(options, options.command == Command::kRun), console);
   std::optional<InterruptWatcher> watcher;
   if (options.inProcess) {
     watcher.emplace([&events] { events.interruptAndLeave([] { ::_exit(static_cast<int>(ExitCode::kInterrupted)); }); });
@@ -150,8 +150,8 @@ ExitCode performNothing(const Options& options, const Installation& installation
   checkOutputs(options);
   const bool isForPeople = options.report.format == Format::kText || !options.report.output.empty();
   (isForPeople ? console.out : console.err) << "Everything passed in the last run.\n" << std::flush;
-  RunEvents events(eventOptions(options, false), console);
-  RunBegan began = beginningOf(options, installation, {}, {});
+  EventPipeline events(eventOptions(options, false), console);
+  RunStarted began = beginningOf(options, installation, {}, {});
   began.phone = options.phone.string();
   events.take(std::move(began));
   events.take(RunEnded{std::nullopt, dateNow()});
@@ -178,14 +178,14 @@ ExitCode runCommand(const Options& given, const Installation& installation, Cons
   if (options.onlyFailed && options.names.empty()) return performNothing(options, installation, console);
   Selection selection = select(options, installation);
   std::vector<Job> jobs;
-  for (BoundDiagnostic& one : selection.diagnostics) {
+  for (ResolvedDiagnostic& one : selection.diagnostics) {
     requireParameters(one.described, one.parameters);
     jobs.push_back({std::move(one), nullptr, options.seed});
   }
   RunOptions runOptions;
   const std::string phone = choosePhone(options, installation, &runOptions.makePhone);
   runOptions.logLevel = options.logLevel.value_or(LogLevel::kDefault);
-  RunBegan began = beginningOf(options, installation, jobs, selection.failed);
+  RunStarted began = beginningOf(options, installation, jobs, selection.failed);
   began.phone = phone;
   return perform(options, installation, console, std::move(began), jobs, selection.failed, runOptions);
 }
@@ -193,12 +193,12 @@ ExitCode runCommand(const Options& given, const Installation& installation, Cons
 namespace {
 
 // The parameters of a recorded run, with those of its analysis replaced that are set now.
-BoundParameters reboundParameters(const DiagnosticRecord& record, const BoundDiagnostic& now) {
-  BoundParameters parameters{record.parameters.experiment, now.parameters.analysis};
-  for (BoundParameter& one : parameters.analysis) {
+ResolvedParameters reboundParameters(const DiagnosticRecord& record, const ResolvedDiagnostic& now) {
+  ResolvedParameters parameters{record.parameters.experiment, now.parameters.analysis};
+  for (ResolvedParameter& one : parameters.analysis) {
     const auto& before = record.parameters.analysis;
     const auto found = std::find_if(before.begin(), before.end(),
-                                    [&one](const BoundParameter& other) { return other.name == one.name; });
+                                    [&one](const ResolvedParameter& other) { return other.name == one.name; });
     if (one.value || found == before.end() || !found->value) continue;
     one.value = found->value;
     one.source = found->source + ", in the record";
@@ -212,11 +212,11 @@ ExitCode analyzeCommand(const Options& given, const Installation& installation, 
   const RecordedRun run = runIn(given.records.front());
   Options options = given;
   if (options.profile.empty()) options.withoutProfile = true;  // the record has what the profile set then
-  for (Setting& setting : options.settings) {
-    if (setting.half == Half::kExperiment) {
-      throw Refusal(ExitCode::kUsage, "--set '" + setting.text + "': analyze runs no experiment");
+  for (ParameterOverride& setting : options.settings) {
+    if (setting.half == Part::kExperiment) {
+      throw CommandError(ExitCode::kUsage, "--set '" + setting.text + "': analyze runs no experiment");
     }
-    setting.half = Half::kAnalysis;
+    setting.half = Part::kAnalysis;
   }
   std::vector<const DiagnosticRecord*> analysable;
   for (const DiagnosticRecord& record : run.records) {
@@ -232,8 +232,8 @@ ExitCode analyzeCommand(const Options& given, const Installation& installation, 
     }
   }
   if (analysable.empty()) {
-    throw Refusal(ExitCode::kCannotRead, "the record '" + given.records.front().string() +
-                                             "' holds no experiment's result that could be analysed");
+    throw CommandError(ExitCode::kCannotRead, "the record '" + given.records.front().string() +
+                                                  "' holds no experiment's result that could be analysed");
   }
   if (options.plugins.empty()) options.plugins.assign(run.began.plugins.begin(), run.began.plugins.end());
   const Selection selection = select(options, installation);
@@ -241,7 +241,7 @@ ExitCode analyzeCommand(const Options& given, const Installation& installation, 
   std::vector<Job> jobs;
   for (std::size_t i = 0; i < analysable.size(); ++i) {
     const DiagnosticRecord& record = *analysable[i];
-    for (const BoundDiagnostic& one : selection.diagnostics) {
+    for (const ResolvedDiagnostic& one : selection.diagnostics) {
       if (one.described.diagnostic.name != record.name) continue;
       results[i].measurements() = record.measurements;
       results[i].auxiliaryData() = record.auxiliaryData;
@@ -250,7 +250,7 @@ ExitCode analyzeCommand(const Options& given, const Installation& installation, 
   }
   RunOptions runOptions;
   runOptions.logLevel = options.logLevel.value_or(LogLevel::kDefault);
-  RunBegan began = beginningOf(options, installation, jobs, selection.failed);
+  RunStarted began = beginningOf(options, installation, jobs, selection.failed);
   began.phone = run.began.phone;
   began.seed = run.began.seed;
   return perform(options, installation, console, std::move(began), jobs, selection.failed, runOptions);

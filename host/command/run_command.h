@@ -6,7 +6,7 @@
 
 namespace quazor {
 
-// Throws a Refusal for what is wrong before anything has run.
+// Throws a CommandError for what is wrong before anything has run.
 ExitCode runCommand(const Options& options, const Installation& installation, Console& console);
 ExitCode analyzeCommand(const Options& options, const Installation& installation, Console& console);
 

@@ -18,9 +18,9 @@ Wanted wantedBy(Command command) {
 std::vector<Diagnostic> allWanted(const std::vector<Diagnostic>& catalogue, Wanted wanted, bool mayBeNone) {
   std::vector<Diagnostic> all = allOf(catalogue, wanted);
   if (!all.empty() || mayBeNone) return all;
-  if (wanted == Wanted::kExperiments) throw Refusal(ExitCode::kUsage, "the loaded plug-ins have no experiment");
+  if (wanted == Wanted::kExperiments) throw CommandError(ExitCode::kUsage, "the loaded plug-ins have no experiment");
   const std::string hint = catalogue.empty() ? "" : ", only experiments; 'quazor experiment --all' runs them";
-  throw Refusal(ExitCode::kUsage, "the loaded plug-ins have no diagnostic" + hint);
+  throw CommandError(ExitCode::kUsage, "the loaded plug-ins have no diagnostic" + hint);
 }
 
 std::vector<Diagnostic> wantedOf(const std::vector<Diagnostic>& catalogue, const Options& options, bool mayBeNone) {
@@ -53,7 +53,7 @@ void describeDoubts(const Options& options, const Installation& installation, co
                     std::vector<DescribedDiagnostic>& catalogue) {
   std::vector<Diagnostic> doubts;
   for (const Profile& profile : profiles) {
-    const std::vector<Diagnostic> more = inDoubt(profile, catalogue);
+    const std::vector<Diagnostic> more = diagnosticsToDescribe(profile, catalogue);
     doubts.insert(doubts.end(), more.begin(), more.end());
   }
   if (doubts.empty()) return;
@@ -63,7 +63,7 @@ void describeDoubts(const Options& options, const Installation& installation, co
     }
     return;
   }
-  const Survey survey =
+  const PluginScan survey =
       surveyOf(options, installation, [&doubts](const std::vector<Diagnostic>& /*catalogue*/) { return doubts; });
   for (DescribedDiagnostic& one : catalogue) {
     for (const DescribedDiagnostic& asked : survey.catalogue) {
@@ -81,9 +81,9 @@ IsolationOptions isolationOf(const Options& options, const Installation& install
   return isolation;
 }
 
-Survey surveyOf(const Options& options, const Installation& installation, const DiagnosticChoice& described) {
+PluginScan surveyOf(const Options& options, const Installation& installation, const DiagnosticChoice& described) {
   const IsolationOptions isolation = isolationOf(options, installation);
-  Survey survey;
+  PluginScan survey;
   if (options.inProcess) {
     loadPlugins(isolation.plugins);
     const std::vector<Diagnostic> catalogue = catalogueOf(QZLab::defaultLab());
@@ -92,18 +92,18 @@ Survey surveyOf(const Options& options, const Installation& installation, const 
     return survey;
   }
   WatchedSignals signals;
-  survey = surveyPlugins(isolation, signals, described);
-  if (survey.interrupted) throw Refusal(ExitCode::kInterrupted, "interrupted while the plug-ins were loaded");
+  survey = scanPlugins(isolation, signals, described);
+  if (survey.interrupted) throw CommandError(ExitCode::kInterrupted, "interrupted while the plug-ins were loaded");
   return survey;
 }
 
-Survey surveyForSelection(const Options& options, const Installation& installation) {
+PluginScan surveyForSelection(const Options& options, const Installation& installation) {
   return surveyOf(options, installation,
                   [&options](const std::vector<Diagnostic>& catalogue) { return wantedOf(catalogue, options, true); });
 }
 
 Selection select(const Options& options, const Installation& installation) {
-  Survey survey = surveyForSelection(options, installation);
+  PluginScan survey = surveyForSelection(options, installation);
   std::vector<DescribedDiagnostic>& described = survey.catalogue;
   std::vector<Diagnostic> catalogue;
   catalogue.reserve(described.size());
@@ -113,7 +113,7 @@ Selection select(const Options& options, const Installation& installation) {
   const std::vector<Profile> profiles = profilesOf(options, installation);
   describeDoubts(options, installation, profiles, described);
   for (const Profile& profile : profiles) checkProfile(profile, described);
-  std::vector<Setting> settings = settingsOfEnvironment();
+  std::vector<ParameterOverride> settings = overridesOfEnvironment();
   settings.insert(settings.end(), options.settings.begin(), options.settings.end());
   std::vector<DescribedDiagnostic> selected;
   for (const Diagnostic& one : wanted) {
@@ -122,10 +122,10 @@ Selection select(const Options& options, const Installation& installation) {
       if (other.name == one.name && other.experimentOnly == one.experimentOnly) selected.push_back(candidate);
     }
   }
-  if (!selected.empty()) checkSettings(settings, selected);
+  if (!selected.empty()) checkOverrides(settings, selected);
   Selection selection{{}, std::move(survey.failed)};
   for (DescribedDiagnostic& one : selected) {
-    BoundParameters parameters = bindParameters(one, profiles, settings);
+    ResolvedParameters parameters = resolveParameters(one, profiles, settings);
     selection.diagnostics.push_back({std::move(one), std::move(parameters)});
   }
   return selection;

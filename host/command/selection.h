@@ -10,7 +10,7 @@
 namespace quazor {
 
 struct Selection {
-  std::vector<BoundDiagnostic> diagnostics;
+  std::vector<ResolvedDiagnostic> diagnostics;
   std::vector<FailedPlugin> failed;  // what could not be loaded
 };
 
@@ -18,12 +18,12 @@ struct Selection {
 IsolationOptions isolationOf(const Options& options, const Installation& installation);
 
 // What the plug-ins have, found out in a process of its own, or in this one with --in-process. `described` chooses what
-// is asked for its description. Throws a Refusal for what cannot be loaded, and kInterrupted for an interrupt.
-Survey surveyOf(const Options& options, const Installation& installation, const DiagnosticChoice& described);
+// is asked for its description. Throws a CommandError for what cannot be loaded, and kInterrupted for an interrupt.
+PluginScan surveyOf(const Options& options, const Installation& installation, const DiagnosticChoice& described);
 
 // What the plug-ins have; only what the options select is asked for its description. Throws as surveyOf, and for names
 // of something else than what the command is for; names that nothing has are passed over.
-Survey surveyForSelection(const Options& options, const Installation& installation);
+PluginScan surveyForSelection(const Options& options, const Installation& installation);
 
 // The selected diagnostics or experiments with their parameters; everything that can be wrong with them has been
 // checked, but for required parameters without a value. Nothing else is asked for its description, unless a profile's

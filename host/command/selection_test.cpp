@@ -40,14 +40,14 @@ class SelectionTest : public testing::Test {
 
   std::vector<std::string> selected() const {
     std::vector<std::string> names;
-    for (const BoundDiagnostic& one : selectNow().diagnostics) names.push_back(one.described.diagnostic.name);
+    for (const ResolvedDiagnostic& one : selectNow().diagnostics) names.push_back(one.described.diagnostic.name);
     return names;
   }
 
   std::string refusal(ExitCode code) const {
     try {
       selectNow();
-    } catch (const Refusal& refusal) {
+    } catch (const CommandError& refusal) {
       EXPECT_EQ(refusal.code(), code) << refusal.what();
       return refusal.what();
     }
@@ -57,7 +57,7 @@ class SelectionTest : public testing::Test {
   // "VALUE from SOURCE" of a parameter of the first diagnostic's experiment.
   std::string parameter(const std::string& name) const {
     const Selection selection = selectNow();
-    for (const BoundParameter& one : selection.diagnostics[0].parameters.experiment) {
+    for (const ResolvedParameter& one : selection.diagnostics[0].parameters.experiment) {
       if (one.name == name) return one.value ? defaultText(*one.value) + " from " + one.source : "not set";
     }
     return "not declared";
@@ -116,7 +116,7 @@ TEST_F(SelectionTest, TakesParametersFromTheLastPlaceThatHasThem) {
   EXPECT_EQ(parameter("measured"), "2 from profile more.json");
   const EnvironmentVariable settings(kSettingsVariable, "measured=3");
   EXPECT_EQ(parameter("measured"), "3 from environment");
-  options_.settings = {parseSetting("measured=4")};
+  options_.settings = {parseOverride("measured=4")};
   EXPECT_EQ(parameter("measured"), "4 from command line");
   options_.profile = directory_.write("mine.json", profileText(R"({"Fake.One": {"experiment": {"duration": 5}}})"));
   EXPECT_EQ(parameter("duration"), "5 from profile mine.json");
@@ -136,7 +136,7 @@ TEST_F(SelectionTest, RefusesWhatIsWrongWithParameters) {
   options_.parameterFiles = {directory_.path() / "nothing.json"};
   EXPECT_THAT(refusal(ExitCode::kCannotRead), HasSubstr("nothing.json"));
   options_.parameterFiles.clear();
-  options_.settings = {parseSetting("measurd=1")};
+  options_.settings = {parseOverride("measurd=1")};
   EXPECT_THAT(refusal(ExitCode::kUsage), HasSubstr("--set 'measurd=1'"));
   options_.settings.clear();
   const EnvironmentVariable settings(kSettingsVariable, "measurd=1");
@@ -209,7 +209,7 @@ TEST_F(SelectionTest, GoesOnWithoutAPluginThatCannotBeLoaded) {
   EXPECT_EQ(selection.failed[0].file, plugin("fatal"));
   options_.plugins = {plugin("fatal")};
   EXPECT_THAT(selected(), IsEmpty());
-  options_.settings = {parseSetting("duration=1")};  // perhaps it is that plug-in's
+  options_.settings = {parseOverride("duration=1")};  // perhaps it is that plug-in's
   EXPECT_THAT(selected(), IsEmpty());
   options_.names.clear();
   options_.all = true;

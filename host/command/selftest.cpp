@@ -145,7 +145,7 @@ std::vector<SelftestVerdict> verdictsOf(const std::vector<SelftestRow>& rows) {
   return verdicts;
 }
 
-bool isAllRight(const std::vector<SelftestVerdict>& verdicts) {
+bool allPassed(const std::vector<SelftestVerdict>& verdicts) {
   return std::all_of(verdicts.begin(), verdicts.end(), [](SelftestVerdict one) {
     return one == SelftestVerdict::kPassed || one == SelftestVerdict::kDetected;
   });
@@ -177,7 +177,7 @@ void printSelftest(std::ostream& out, const std::vector<SelftestRow>& rows, std:
   }
   matrix.print(out, "");
   out << formatMessage("\nPhones: %@, runs: %@, seeds of each: %@; %@\n", phonesIn(rows), rows.size(), seeds,
-                       isAllRight(verdicts) ? "all as expected" : "NOT all as expected");
+                       allPassed(verdicts) ? "all as expected" : "NOT all as expected");
 }
 
 Json selftestDocument(const std::vector<SelftestRow>& rows, std::uint64_t seeds) {
@@ -197,7 +197,7 @@ Json selftestDocument(const std::vector<SelftestRow>& rows, std::uint64_t seeds)
                     {"difference", row.difference.empty() ? Json() : Json(row.difference)},
                     {"faultsFired", row.faultsFired}});
   }
-  return {{"schema", 1}, {"seeds", seeds}, {"allAsExpected", isAllRight(verdicts)}, {"rows", std::move(json)}};
+  return {{"schema", 1}, {"seeds", seeds}, {"allAsExpected", allPassed(verdicts)}, {"rows", std::move(json)}};
 }
 
 }  // namespace quazor

@@ -42,7 +42,7 @@ std::string differenceOf(const ExpectedOutcome& expected, const DiagnosticRecord
 std::vector<SelftestVerdict> verdictsOf(const std::vector<SelftestRow>& rows);
 
 // True when every row is kPassed or kDetected.
-bool isAllRight(const std::vector<SelftestVerdict>& verdicts);
+bool allPassed(const std::vector<SelftestVerdict>& verdicts);
 
 // A line for every row, then, for each diagnostic, how many faults were detected and how many alarms were false.
 void printSelftest(std::ostream& out, const std::vector<SelftestRow>& rows, std::uint64_t seeds);

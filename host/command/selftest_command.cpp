@@ -27,7 +27,8 @@ std::vector<std::string> wantedScenarios(const Options& options, const Installat
       if (matchesName(name, one) && std::find(wanted.begin(), wanted.end(), one) == wanted.end()) wanted.push_back(one);
     }
     const bool found = wanted.size() > before || std::find(wanted.begin(), wanted.end(), name) != wanted.end();
-    if (!found) throw Refusal(ExitCode::kUsage, "there is no installed phone '" + name + "'" + didYouMean(name, all));
+    if (!found)
+      throw CommandError(ExitCode::kUsage, "there is no installed phone '" + name + "'" + didYouMean(name, all));
   }
   return wanted;
 }
@@ -52,7 +53,7 @@ class Selftest {
         SelftestRow row{name, expected, 0, 0, 0, {}, {}};
         for (std::uint64_t seed = 0; seed < options_.seeds; ++seed) {
           count(row, run(file, expected, seed));
-          if (signals_ && signals_->requestsToEnd() > 0) throw Refusal(ExitCode::kInterrupted, "interrupted");
+          if (signals_ && signals_->requestsToEnd() > 0) throw CommandError(ExitCode::kInterrupted, "interrupted");
         }
         rows.push_back(std::move(row));
       }
@@ -84,29 +85,30 @@ class Selftest {
       const Diagnostic& diagnostic = one.diagnostic;
       if (diagnostic.name == expected.name && diagnostic.experimentOnly == expected.experimentOnly) return one;
     }
-    throw Refusal(ExitCode::kCannotRead, "the plug-ins have no " + expected.name + ", which an installed phone is for");
+    throw CommandError(ExitCode::kCannotRead,
+                       "the plug-ins have no " + expected.name + ", which an installed phone is for");
   }
 
-  BoundParameters parametersOf(const DescribedDiagnostic& described, const ExpectedOutcome& expected) const {
-    if (!expected.experimentOnly) return bindParameters(described, {profile_}, {});
-    std::vector<Setting> settings;
+  ResolvedParameters parametersOf(const DescribedDiagnostic& described, const ExpectedOutcome& expected) const {
+    if (!expected.experimentOnly) return resolveParameters(described, {profile_}, {});
+    std::vector<ParameterOverride> settings;
     for (const auto& [name, value] : expected.parameters) {
       // As it would stand on a command line: a whole number is an integer.
-      settings.push_back(parseSetting(formatMessage("%@=%@", name, value)));
+      settings.push_back(parseOverride(formatMessage("%@=%@", name, value)));
     }
-    return bindParameters(described, {}, settings);
+    return resolveParameters(described, {}, settings);
   }
 
   DiagnosticRecord run(const std::filesystem::path& file, const ExpectedOutcome& expected, std::uint64_t seed) {
     const DescribedDiagnostic& described = find(expected);
     const Diagnostic& diagnostic = described.diagnostic;
-    const BoundParameters parameters = parametersOf(described, expected);
+    const ResolvedParameters parameters = parametersOf(described, expected);
     RunOptions runOptions;
     runOptions.makePhone = phonesOfScenario(file, false, seed);
     runOptions.logLevel = LogLevel::kError;
     RecordBuilder builder;
-    builder.take(DiagnosticBegan{diagnostic.name, described.summary(), diagnostic.experimentName,
-                                 diagnostic.analysisName, diagnostic.experimentOnly, parameters, seed, dateNow()});
+    builder.take(DiagnosticStarted{diagnostic.name, described.summary(), diagnostic.experimentName,
+                                   diagnostic.analysisName, diagnostic.experimentOnly, parameters, seed, dateNow()});
     progress_.start(file.stem().string(), {});
     if (options_.inProcess) {
       runDiagnostic(diagnostic, parameters, runOptions, builder);
@@ -120,7 +122,7 @@ class Selftest {
 
   const Options options_;
   const Installation& installation_;
-  const Survey survey_;
+  const PluginScan survey_;
   const IsolationOptions isolation_;
   Progress progress_;
   Profile profile_;
@@ -137,8 +139,8 @@ ExitCode selftestCommand(const Options& options, const Installation& installatio
   } else {
     printSelftest(text, rows, options.seeds);
   }
-  writeAnswer(options.report, console, text.str());
-  return isAllRight(verdictsOf(rows)) ? ExitCode::kAllPassed : ExitCode::kFailed;
+  writeOutput(options.report, console, text.str());
+  return allPassed(verdictsOf(rows)) ? ExitCode::kAllPassed : ExitCode::kFailed;
 }
 
 }  // namespace quazor

@@ -89,8 +89,8 @@ TEST(SelftestVerdicts, TellDetectionsFromMissesAndFalseAlarms) {
               ElementsAre(SelftestVerdict::kPassed, SelftestVerdict::kDetected, SelftestVerdict::kMissed,
                           SelftestVerdict::kFalseAlarm, SelftestVerdict::kDifferent, SelftestVerdict::kInvalid,
                           SelftestVerdict::kInvalid));
-  EXPECT_FALSE(isAllRight(verdictsOf(all)));
-  EXPECT_TRUE(isAllRight(verdictsOf({rows[0], rows[1]})));
+  EXPECT_FALSE(allPassed(verdictsOf(all)));
+  EXPECT_TRUE(allPassed(verdictsOf({rows[0], rows[1]})));
 }
 
 TEST(SelftestVerdicts, CountThePhonesFaultsInAllOfItsRowsTogether) {

@@ -42,8 +42,8 @@ class Phone {
 using PhoneMaker = std::function<std::unique_ptr<Phone>()>;
 
 // Reads a scenario file and gives the maker of the phones it describes: in virtual time, or in real time when
-// `realTime`. One seed is one course of events in virtual time. Makes no phone itself. Throws a Refusal (kCannotRead)
-// with the reader's sentence when the file cannot be read.
+// `realTime`. One seed is one course of events in virtual time. Makes no phone itself. Throws a CommandError
+// (kCannotRead) with the reader's sentence when the file cannot be read.
 PhoneMaker phonesOfScenario(const std::filesystem::path& file, bool realTime, std::uint64_t seed);
 
 // The parts of an error that an outcome is expected to have.
@@ -78,7 +78,7 @@ inline constexpr std::string_view kLinuxPrefix = "linux:";
 std::optional<std::filesystem::path> bindingNamed(const std::filesystem::path& phone);
 
 // Reads a binding file and gives the maker of this machine as a phone, which is always the same one, in real time.
-// Throws a Refusal (kCannotRead) with the reader's sentence when the file cannot be read.
+// Throws a CommandError (kCannotRead) with the reader's sentence when the file cannot be read.
 PhoneMaker phonesOfBinding(const std::filesystem::path& file);
 
 // What this machine has for a binding to name: for people, line by line, and a binding to start from, a file's text.
@@ -95,7 +95,7 @@ bool isCleanupProcess(std::string_view processName);
 // Where this machine keeps log lines: its journal, or syslog(3) where there is none.
 std::shared_ptr<LogBackend> systemLogOfThisMachine();
 
-// What a scenario file says of itself. Throws a Refusal (kCannotRead) when the file cannot be read.
+// What a scenario file says of itself. Throws a CommandError (kCannotRead) when the file cannot be read.
 ScenarioSummary summaryOfScenario(const std::filesystem::path& file);
 
 }  // namespace quazor

@@ -74,7 +74,7 @@ TEST(PhonesOfScenario, RefusesAScenarioThatCannotBeRead) {
     try {
       phonesOfScenario(file, false, 1);
       ADD_FAILURE() << file << " was accepted";
-    } catch (const Refusal& refusal) {
+    } catch (const CommandError& refusal) {
       EXPECT_EQ(refusal.code(), ExitCode::kCannotRead) << file;
       EXPECT_THAT(refusal.what(), testing::HasSubstr(file.filename().string())) << file;
     }
@@ -108,7 +108,7 @@ TEST(PhonesOfBinding, RefusesABindingThatCannotBeRead) {
   try {
     phonesOfBinding(directory.write("bad.json", "{\n\"titel\": 1}"));
     ADD_FAILURE() << "it was accepted";
-  } catch (const Refusal& refusal) {
+  } catch (const CommandError& refusal) {
     EXPECT_EQ(refusal.code(), ExitCode::kCannotRead);
     EXPECT_THAT(refusal.what(), testing::HasSubstr("bad.json:2: the document: there is no key \"titel\""));
   }

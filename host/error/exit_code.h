@@ -20,9 +20,9 @@ enum class ExitCode : int {
 };
 
 // A request that is refused before anything has been touched. Its text is one clear sentence for the user.
-class Refusal : public std::runtime_error {
+class CommandError : public std::runtime_error {
  public:
-  Refusal(ExitCode code, const std::string& text) : std::runtime_error(text), code_(code) {}
+  CommandError(ExitCode code, const std::string& text) : std::runtime_error(text), code_(code) {}
 
   ExitCode code() const { return code_; }
 

@@ -44,7 +44,7 @@ struct DiagnosticRecord {
   std::string experimentName;
   std::string analysisName;  // empty for an experiment on its own
   Verdict verdict = Verdict::kError;
-  BoundParameters parameters;
+  ResolvedParameters parameters;
   std::vector<JudgedResult> measuredResults;
   OrderedMap<Measurement> measurements;
   Dictionary auxiliaryData;

@@ -184,7 +184,7 @@ TEST(GeneratedRuns, HaveTheVerdictOfTheOracle) {
   for (int i = 0; i < kRuns; ++i) {
     const Script script = random.script();
     EventList events;
-    DiagnosticBegan began = beginningOf("Scripted");
+    DiagnosticStarted began = beginningOf("Scripted");
     began.experimentOnly = script.experimentOnly;
     events.take(began);
     runDiagnostic(diagnosticOf(script), {}, options, events);

@@ -15,7 +15,7 @@
 namespace quazor {
 namespace {
 
-constexpr double kLeast = std::numeric_limits<double>::denorm_min();
+constexpr double kMinimum = std::numeric_limits<double>::denorm_min();
 
 enum class End { kNone, kClosed, kOpen };
 
@@ -74,8 +74,8 @@ TEST(JudgeResult, ComparesTheValueWithItsBounds) {
       {"on the closed end of a half-open range", 1, kClosed, 1, kOpen, 9, kPass},
       {"the one value of a zero limit", 0, kClosed, 0, kClosed, 0, kPass},
       {"negative zero in a zero limit", -0.0, kClosed, 0, kClosed, 0, kPass},
-      {"the least value above a zero limit", kLeast, kClosed, 0, kClosed, 0, kFail},
-      {"the least value below a zero limit", -kLeast, kClosed, 0, kClosed, 0, kFail},
+      {"the least value above a zero limit", kMinimum, kClosed, 0, kClosed, 0, kFail},
+      {"the least value below a zero limit", -kMinimum, kClosed, 0, kClosed, 0, kFail},
       {"a negative value above a negative bound", -1, kClosed, -2, kNo, 0, kPass},
   };
   for (const Row& row : rows) {

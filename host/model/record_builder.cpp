@@ -25,9 +25,9 @@ std::vector<RunEvent> RecordBuilder::ending(Date date) const {
   return events;
 }
 
-void RecordBuilder::fold(const RunBegan& /*event*/) {}
+void RecordBuilder::fold(const RunStarted& /*event*/) {}
 
-void RecordBuilder::fold(const DiagnosticBegan& event) {
+void RecordBuilder::fold(const DiagnosticStarted& event) {
   record_ = DiagnosticRecord();
   record_.name = event.name;
   record_.summary = event.summary;
@@ -42,7 +42,7 @@ void RecordBuilder::fold(const DiagnosticBegan& event) {
   completed_ = false;
 }
 
-void RecordBuilder::fold(const StageBegan& event) {
+void RecordBuilder::fold(const StageStarted& event) {
   record_.stages.push_back({event.stage, event.date, std::nullopt});
   record_.end = event.date;
 }
@@ -59,13 +59,13 @@ void RecordBuilder::fold(const StageEnded& event) {
 
 void RecordBuilder::fold(const Logged& event) { record_.log.push_back(event.line); }
 
-void RecordBuilder::fold(const Measured& event) {
+void RecordBuilder::fold(const MeasurementsAdded& event) {
   for (const auto& [name, measurement] : event.measurements) record_.measurements.set(name, measurement);
 }
 
-void RecordBuilder::fold(const Collected& event) { record_.auxiliaryData.set(event.key, event.value); }
+void RecordBuilder::fold(const AuxiliaryDataAdded& event) { record_.auxiliaryData.set(event.key, event.value); }
 
-void RecordBuilder::fold(const Found& event) {
+void RecordBuilder::fold(const ResultsReported& event) {
   for (const QZMeasuredResult& result : event.results) {
     record_.measuredResults.push_back({result, judgeResult(result).verdict});
   }

@@ -9,12 +9,12 @@
 namespace quazor {
 
 // Folds the events of one diagnostic after the other. Events that belong to no diagnostic, and those of a diagnostic
-// before its DiagnosticBegan, change nothing.
+// before its DiagnosticStarted, change nothing.
 class RecordBuilder final : public RunEventSink {
  public:
   void take(const RunEvent& event) override;
 
-  // True from DiagnosticBegan to DiagnosticEnded.
+  // True from DiagnosticStarted to DiagnosticEnded.
   bool isOpen() const { return open_; }
   // True when the plug-in's part is over.
   bool isCompleted() const { return completed_; }
@@ -30,14 +30,14 @@ class RecordBuilder final : public RunEventSink {
   std::vector<RunEvent> ending(Date date) const;
 
  private:
-  void fold(const RunBegan& event);
-  void fold(const DiagnosticBegan& event);
-  void fold(const StageBegan& event);
+  void fold(const RunStarted& event);
+  void fold(const DiagnosticStarted& event);
+  void fold(const StageStarted& event);
   void fold(const StageEnded& event);
   void fold(const Logged& event);
-  void fold(const Measured& event);
-  void fold(const Collected& event);
-  void fold(const Found& event);
+  void fold(const MeasurementsAdded& event);
+  void fold(const AuxiliaryDataAdded& event);
+  void fold(const ResultsReported& event);
   void fold(const Failed& event);
   void fold(const FaultsCounted& event);
   void fold(const DiagnosticCompleted& event);

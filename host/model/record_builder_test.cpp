@@ -57,8 +57,9 @@ TEST_F(RecordBuilderTest, FoldsEverythingThatADiagnosticTells) {
 }
 
 TEST_F(RecordBuilderTest, TimesTeardownAndAnalysis) {
-  takeAll({beginningOf("A"), StageBegan{Stage::kTeardown, momentAt(2)}, StageEnded{Stage::kTeardown, 5ns, momentAt(3)},
-           StageBegan{Stage::kAnalyse, momentAt(4)}, StageEnded{Stage::kAnalyse, 6ns, momentAt(5)}});
+  takeAll({beginningOf("A"), StageStarted{Stage::kTeardown, momentAt(2)},
+           StageEnded{Stage::kTeardown, 5ns, momentAt(3)}, StageStarted{Stage::kAnalyse, momentAt(4)},
+           StageEnded{Stage::kAnalyse, 6ns, momentAt(5)}});
   EXPECT_EQ(builder_.record().durations.teardown, 5ns);
   EXPECT_EQ(builder_.record().durations.analysis, 6ns);
   EXPECT_EQ(builder_.record().durations.setup, std::nullopt);
@@ -70,7 +71,7 @@ TEST_F(RecordBuilderTest, KnowsWhatIsOpen) {
   EXPECT_EQ(builder_.stage(), std::nullopt);
   builder_.take(runOf({"A"}));
   EXPECT_FALSE(builder_.isOpen());
-  takeAll({beginningOf("A"), StageBegan{Stage::kSetup, momentAt(2)}});
+  takeAll({beginningOf("A"), StageStarted{Stage::kSetup, momentAt(2)}});
   EXPECT_TRUE(builder_.isOpen());
   EXPECT_FALSE(builder_.isCompleted());
   EXPECT_EQ(builder_.stage(), Stage::kSetup);
@@ -86,7 +87,7 @@ TEST_F(RecordBuilderTest, KnowsWhatIsOpen) {
 }
 
 TEST_F(RecordBuilderTest, LeavesAStageOpenWhenAnotherOneEnds) {
-  takeAll({beginningOf("A"), StageBegan{Stage::kSetup, momentAt(2)}, StageEnded{Stage::kRun, 0ns, momentAt(3)}});
+  takeAll({beginningOf("A"), StageStarted{Stage::kSetup, momentAt(2)}, StageEnded{Stage::kRun, 0ns, momentAt(3)}});
   EXPECT_EQ(builder_.stage(), Stage::kSetup);
   EXPECT_EQ(builder_.record().end, momentAt(3));
 }
@@ -118,16 +119,19 @@ TEST_F(RecordBuilderTest, EndsWithTheVerdictThatFollows) {
   const DiagnosticErrorPtr error = errorWithMessage("D", 1, "m", nullptr);
   const double nan = std::numeric_limits<double>::quiet_NaN();
   const Row rows[] = {
-      {"a pass", {Found{{resultOf(90)}}, DiagnosticCompleted{}}, "diagnosticEnded", Verdict::kPass},
-      {"a failure", {Found{{resultOf(89)}}, DiagnosticCompleted{}}, "diagnosticEnded", Verdict::kFail},
+      {"a pass", {ResultsReported{{resultOf(90)}}, DiagnosticCompleted{}}, "diagnosticEnded", Verdict::kPass},
+      {"a failure", {ResultsReported{{resultOf(89)}}, DiagnosticCompleted{}}, "diagnosticEnded", Verdict::kFail},
       {"an error of its own", {Failed{Stage::kRun, error}, DiagnosticCompleted{}}, "diagnosticEnded", Verdict::kError},
       {"an error with results",
-       {Found{{resultOf(90)}}, Failed{Stage::kTeardown, error}, DiagnosticCompleted{}},
+       {ResultsReported{{resultOf(90)}}, Failed{Stage::kTeardown, error}, DiagnosticCompleted{}},
        "diagnosticEnded",
        Verdict::kError},
-      {"the judge's error", {Found{{resultOf(nan)}}, DiagnosticCompleted{}}, "failed diagnosticEnded", Verdict::kError},
+      {"the judge's error",
+       {ResultsReported{{resultOf(nan)}}, DiagnosticCompleted{}},
+       "failed diagnosticEnded",
+       Verdict::kError},
       {"nothing measured", {DiagnosticCompleted{}}, "failed diagnosticEnded", Verdict::kError},
-      {"not completed", {Found{{resultOf(90)}}}, "failed diagnosticEnded", Verdict::kError},
+      {"not completed", {ResultsReported{{resultOf(90)}}}, "failed diagnosticEnded", Verdict::kError},
       {"a verdict of the plug-in's",
        {DiagnosticEnded{Verdict::kPass, momentAt(2)}},
        "failed diagnosticEnded",

@@ -15,7 +15,7 @@
 namespace quazor {
 
 // The first event: what is run, with what, on what.
-struct RunBegan {
+struct RunStarted {
   std::string program;  // the version of quazor
   int contract = 0;     // the version of the plug-in contract
   Date date{};
@@ -26,18 +26,18 @@ struct RunBegan {
   std::vector<std::string> names;  // of what is to be run
 };
 
-struct DiagnosticBegan {
+struct DiagnosticStarted {
   std::string name;
   std::string summary;
   std::string experimentName;
   std::string analysisName;  // empty for an experiment on its own
   bool experimentOnly = false;
-  BoundParameters parameters;
+  ResolvedParameters parameters;
   std::uint64_t seed = 0;
   Date date{};
 };
 
-struct StageBegan {
+struct StageStarted {
   Stage stage;
   Date date{};
 };
@@ -53,18 +53,18 @@ struct Logged {
 };
 
 // Some of the measurements of the experiment's result, in its order.
-struct Measured {
+struct MeasurementsAdded {
   std::vector<std::pair<std::string, Measurement>> measurements;
 };
 
 // An entry of the result's auxiliary data.
-struct Collected {
+struct AuxiliaryDataAdded {
   std::string key;
   Value value;
 };
 
 // Some of the analysis' measured results, in its order.
-struct Found {
+struct ResultsReported {
   std::vector<QZMeasuredResult> results;
 };
 
@@ -91,8 +91,9 @@ struct RunEnded {
   Date date{};
 };
 
-using RunEvent = std::variant<RunBegan, DiagnosticBegan, StageBegan, StageEnded, Logged, Measured, Collected, Found,
-                              Failed, FaultsCounted, DiagnosticCompleted, DiagnosticEnded, RunEnded>;
+using RunEvent =
+    std::variant<RunStarted, DiagnosticStarted, StageStarted, StageEnded, Logged, MeasurementsAdded, AuxiliaryDataAdded,
+                 ResultsReported, Failed, FaultsCounted, DiagnosticCompleted, DiagnosticEnded, RunEnded>;
 
 // Takes a run's events, in their order.
 class RunEventSink {

@@ -90,14 +90,14 @@ class RandomEvents {
  private:
   RunEvent event(Told* told) {
     switch (random_.below(16)) {
-      case 0: return StageBegan{stage(), momentAt(2)};
+      case 0: return StageStarted{stage(), momentAt(2)};
       case 1: return StageEnded{stage(), std::nullopt, momentAt(2)};
       case 2: return Logged{{{}, LogLevel::kError, random_.text(), momentAt(3)}};
-      case 3: return Measured{{{random_.text(), random_.measurement()}}};
-      case 4: return Collected{random_.text(), random_.value(1)};
+      case 3: return MeasurementsAdded{{{random_.text(), random_.measurement()}}};
+      case 4: return AuxiliaryDataAdded{random_.text(), random_.value(1)};
       case 5: return FaultsCounted{};
       case 6: told->hasError = true; return Failed{stage(), someError()};
-      case 7: return random_.chance(20) ? completed(told) : RunEvent(StageBegan{stage(), momentAt(2)});
+      case 7: return random_.chance(20) ? completed(told) : RunEvent(StageStarted{stage(), momentAt(2)});
       default: return found(told);
     }
   }
@@ -110,7 +110,7 @@ class RandomEvents {
   Stage stage() { return kStages[random_.below(std::size(kStages))]; }
 
   RunEvent found(Told* told) {
-    Found found;
+    ResultsReported found;
     for (std::uint64_t i = random_.below(3); i > 0; --i) {
       // Such that all verdicts are frequent.
       if (random_.chance(10)) {

@@ -15,16 +15,16 @@ namespace quazor {
 namespace {
 
 // How a setting is called in messages: where it stands, and its text.
-std::string quoted(SettingPlace place, const std::string& text) {
-  const std::string where = place == SettingPlace::kEnvironment ? kSettingsVariable : "--set";
+std::string quoted(OverridePlace place, const std::string& text) {
+  const std::string where = place == OverridePlace::kEnvironment ? kSettingsVariable : "--set";
   return where + " '" + text + "'";
 }
 
-std::string_view sourceOf(SettingPlace place) {
-  return place == SettingPlace::kEnvironment ? "environment" : "command line";
+std::string_view sourceOf(OverridePlace place) {
+  return place == OverridePlace::kEnvironment ? "environment" : "command line";
 }
 
-constexpr Half kHalves[] = {Half::kExperiment, Half::kAnalysis};
+constexpr Part kHalves[] = {Part::kExperiment, Part::kAnalysis};
 
 // What several of them are called.
 std::string nounOf(const std::vector<DescribedDiagnostic>& diagnostics) {
@@ -34,20 +34,20 @@ std::string nounOf(const std::vector<DescribedDiagnostic>& diagnostics) {
   return "diagnostics";
 }
 
-const OrderedMap<QZNumberParameter>& declared(const DescribedDiagnostic& diagnostic, Half half) {
+const OrderedMap<QZNumberParameter>& declared(const DescribedDiagnostic& diagnostic, Part half) {
   const DiagnosticDescription& description = diagnostic.description;
-  return (half == Half::kExperiment ? description.experiment : description.analysis).parameters();
+  return (half == Part::kExperiment ? description.experiment : description.analysis).parameters();
 }
 
-bool sets(const Setting& setting, Half half, std::string_view name) {
+bool sets(const ParameterOverride& setting, Part half, std::string_view name) {
   return (!setting.half || *setting.half == half) && setting.name == name;
 }
 
 // The names that the diagnostics declare in that half or, without one, in any.
-std::vector<std::string> declaredNames(const std::vector<DescribedDiagnostic>& diagnostics, std::optional<Half> half) {
+std::vector<std::string> declaredNames(const std::vector<DescribedDiagnostic>& diagnostics, std::optional<Part> half) {
   std::vector<std::string> names;
   for (const DescribedDiagnostic& diagnostic : diagnostics) {
-    for (const Half one : kHalves) {
+    for (const Part one : kHalves) {
       if (half && *half != one) continue;
       for (const auto& [name, ignored] : declared(diagnostic, one)) names.push_back(name);
     }
@@ -74,13 +74,13 @@ void checkEntry(const Profile& profile, const ProfileEntry& entry, const std::ve
     return one.description.isAsked && one.description.error == nullptr;
   });
   if (!allDescribed) return;
-  for (const Half half : kHalves) {
+  for (const Part half : kHalves) {
     const std::vector<std::string> names = declaredNames(matched, half);
     for (const auto& [name, ignored] : entry.values(half)) {
       if (contains(names, name)) continue;
-      throw Refusal(ExitCode::kCannotRead, "the " + profile.kind + " '" + profile.file.string() + "' sets '" + name +
-                                               "', which no " + std::string(nameOf(half)) + " of '" + entry.name +
-                                               "' takes" + didYouMean(name, names));
+      throw CommandError(ExitCode::kCannotRead, "the " + profile.kind + " '" + profile.file.string() + "' sets '" +
+                                                    name + "', which no " + std::string(nameOf(half)) + " of '" +
+                                                    entry.name + "' takes" + didYouMean(name, names));
     }
   }
 }
@@ -98,7 +98,7 @@ std::vector<DescribedDiagnostic> matchesOf(const ProfileEntry& entry, const std:
 
 // True when each parameter that the entry sets is declared by one of the diagnostics.
 bool declareAll(const std::vector<DescribedDiagnostic>& diagnostics, const ProfileEntry& entry) {
-  for (const Half half : kHalves) {
+  for (const Part half : kHalves) {
     const std::vector<std::string> names = declaredNames(diagnostics, half);
     for (const auto& [name, ignored] : entry.values(half)) {
       if (!contains(names, name)) return false;
@@ -108,8 +108,8 @@ bool declareAll(const std::vector<DescribedDiagnostic>& diagnostics, const Profi
 }
 
 // Adds those of the matches that are in doubt.
-void addDoubts(const ProfileEntry& entry, const std::vector<DescribedDiagnostic>& matched,
-               std::vector<Diagnostic>& doubts) {
+void addDiagnosticsToDescribe(const ProfileEntry& entry, const std::vector<DescribedDiagnostic>& matched,
+                              std::vector<Diagnostic>& doubts) {
   std::vector<DescribedDiagnostic> asked;
   std::copy_if(matched.begin(), matched.end(), std::back_inserter(asked),
                [](const DescribedDiagnostic& one) { return one.description.isAsked; });
@@ -134,30 +134,32 @@ void checkEntries(const Profile& profile, const std::vector<ProfileEntry>& entri
       for (const DescribedDiagnostic& one : catalogue) {
         if (one.diagnostic.experimentOnly == ofExperiments) names.push_back(one.diagnostic.name);
       }
-      throw Refusal(ExitCode::kCannotRead, "the profile '" + profile.file.string() + "' has an entry '" + entry.name +
-                                               "', which fits no " + noun + didYouMean(entry.name, names));
+      throw CommandError(ExitCode::kCannotRead, "the profile '" + profile.file.string() + "' has an entry '" +
+                                                    entry.name + "', which fits no " + noun +
+                                                    didYouMean(entry.name, names));
     }
   }
 }
 
-const Value* findIn(const Profile& profile, const Diagnostic& diagnostic, Half half, std::string_view parameter) {
+const Value* findIn(const Profile& profile, const Diagnostic& diagnostic, Part half, std::string_view parameter) {
   return diagnostic.experimentOnly ? profile.findForExperiment(diagnostic.name, diagnostic.usedBy, parameter)
                                    : profile.find(diagnostic.name, half, parameter);
 }
 
-std::vector<BoundParameter> bindHalf(const DescribedDiagnostic& diagnostic, Half half,
-                                     const std::vector<Profile>& profiles, const std::vector<Setting>& settings) {
-  std::vector<BoundParameter> bound;
+std::vector<ResolvedParameter> bindHalf(const DescribedDiagnostic& diagnostic, Part half,
+                                        const std::vector<Profile>& profiles,
+                                        const std::vector<ParameterOverride>& settings) {
+  std::vector<ResolvedParameter> bound;
   for (const auto& [name, declaration] : declared(diagnostic, half)) {
-    BoundParameter parameter{name, declaration, std::nullopt, {}};
+    ResolvedParameter parameter{name, declaration, std::nullopt, {}};
     for (const Profile& profile : profiles) {
       const Value* const value = findIn(profile, diagnostic.diagnostic, half, name);
       if (value == nullptr) continue;
       parameter.value = *value;
       parameter.source = profile.kind + " " + profile.file.filename().string();
     }
-    for (const SettingPlace place : {SettingPlace::kEnvironment, SettingPlace::kCommandLine}) {
-      for (const Setting& setting : settings) {
+    for (const OverridePlace place : {OverridePlace::kEnvironment, OverridePlace::kCommandLine}) {
+      for (const ParameterOverride& setting : settings) {
         if (setting.place != place || !sets(setting, half, name)) continue;
         parameter.value = setting.value;
         parameter.source = sourceOf(place);
@@ -170,38 +172,38 @@ std::vector<BoundParameter> bindHalf(const DescribedDiagnostic& diagnostic, Half
 
 }  // namespace
 
-Setting parseSetting(const std::string& text, SettingPlace place) {
+ParameterOverride parseOverride(const std::string& text, OverridePlace place) {
   const std::string what = quoted(place, text) + ": ";
   const std::size_t equals = text.find('=');
   if (equals == std::string::npos) {
-    throw Refusal(ExitCode::kUsage, what + "it must have the form [experiment.|analysis.]NAME=VALUE");
+    throw CommandError(ExitCode::kUsage, what + "it must have the form [experiment.|analysis.]NAME=VALUE");
   }
-  Setting setting{text, std::nullopt, text.substr(0, equals), 0, place};
-  for (const Half half : kHalves) {
+  ParameterOverride setting{text, std::nullopt, text.substr(0, equals), 0, place};
+  for (const Part half : kHalves) {
     const std::string prefix = std::string(nameOf(half)) + ".";
     if (setting.half || !setting.name.starts_with(prefix)) continue;
     setting.half = half;
     setting.name.erase(0, prefix.size());
   }
-  if (setting.name.empty()) throw Refusal(ExitCode::kUsage, what + "the parameter's name is missing");
+  if (setting.name.empty()) throw CommandError(ExitCode::kUsage, what + "the parameter's name is missing");
   std::string problem;
   const std::optional<Value> value = parseNumber(std::string_view(text).substr(equals + 1), &problem);
-  if (!value) throw Refusal(ExitCode::kUsage, what + problem);
+  if (!value) throw CommandError(ExitCode::kUsage, what + problem);
   setting.value = *value;
   return setting;
 }
 
-std::vector<Setting> settingsOfEnvironment() {
-  std::vector<Setting> settings;
+std::vector<ParameterOverride> overridesOfEnvironment() {
+  std::vector<ParameterOverride> settings;
   const char* const variable = std::getenv(kSettingsVariable);
   std::istringstream texts(variable == nullptr ? "" : variable);
-  for (std::string text; texts >> text;) settings.push_back(parseSetting(text, SettingPlace::kEnvironment));
+  for (std::string text; texts >> text;) settings.push_back(parseOverride(text, OverridePlace::kEnvironment));
   return settings;
 }
 
-Dictionary dictionaryOf(const std::vector<BoundParameter>& parameters) {
+Dictionary dictionaryOf(const std::vector<ResolvedParameter>& parameters) {
   Dictionary dictionary;
-  for (const BoundParameter& parameter : parameters) {
+  for (const ResolvedParameter& parameter : parameters) {
     if (parameter.value) dictionary.set(parameter.name, *parameter.value);
   }
   return dictionary;
@@ -212,51 +214,54 @@ void checkProfile(const Profile& profile, const std::vector<DescribedDiagnostic>
   checkEntries(profile, profile.experiments, catalogue, true);
 }
 
-std::vector<Diagnostic> inDoubt(const Profile& profile, const std::vector<DescribedDiagnostic>& catalogue) {
+std::vector<Diagnostic> diagnosticsToDescribe(const Profile& profile,
+                                              const std::vector<DescribedDiagnostic>& catalogue) {
   std::vector<Diagnostic> doubts;
-  for (const ProfileEntry& entry : profile.entries) addDoubts(entry, matchesOf(entry, catalogue, false), doubts);
-  for (const ProfileEntry& entry : profile.experiments) addDoubts(entry, matchesOf(entry, catalogue, true), doubts);
+  for (const ProfileEntry& entry : profile.entries)
+    addDiagnosticsToDescribe(entry, matchesOf(entry, catalogue, false), doubts);
+  for (const ProfileEntry& entry : profile.experiments)
+    addDiagnosticsToDescribe(entry, matchesOf(entry, catalogue, true), doubts);
   return doubts;
 }
 
-void checkSettings(const std::vector<Setting>& settings, const std::vector<DescribedDiagnostic>& selected) {
+void checkOverrides(const std::vector<ParameterOverride>& settings, const std::vector<DescribedDiagnostic>& selected) {
   for (std::size_t i = 0; i < settings.size(); ++i) {
-    const Setting& setting = settings[i];
+    const ParameterOverride& setting = settings[i];
     const std::vector<std::string> names = declaredNames(selected, setting.half);
     if (!contains(names, setting.name)) {
       const std::string noun = nounOf(selected);
       const std::string where =
           setting.half ? "no " + std::string(nameOf(*setting.half)) + " of the " + noun : "none of the " + noun;
-      throw Refusal(ExitCode::kUsage, quoted(setting.place, setting.text) + ": " + where + " takes a parameter '" +
-                                          setting.name + "'" + didYouMean(setting.name, names) +
-                                          noteOfUndescribed(selected));
+      throw CommandError(ExitCode::kUsage, quoted(setting.place, setting.text) + ": " + where + " takes a parameter '" +
+                                               setting.name + "'" + didYouMean(setting.name, names) +
+                                               noteOfUndescribed(selected));
     }
     for (std::size_t j = 0; j < i; ++j) {
-      const Setting& other = settings[j];
+      const ParameterOverride& other = settings[j];
       const bool overlap = other.place == setting.place && other.name == setting.name &&
                            (!other.half || !setting.half || *other.half == *setting.half);
       if (!overlap) continue;
-      throw Refusal(ExitCode::kUsage, quoted(other.place, other.text) + " and " + quoted(setting.place, setting.text) +
-                                          " set the same parameter twice");
+      throw CommandError(ExitCode::kUsage, quoted(other.place, other.text) + " and " +
+                                               quoted(setting.place, setting.text) + " set the same parameter twice");
     }
   }
 }
 
-BoundParameters bindParameters(const DescribedDiagnostic& diagnostic, const std::vector<Profile>& profiles,
-                               const std::vector<Setting>& settings) {
-  return {bindHalf(diagnostic, Half::kExperiment, profiles, settings),
-          bindHalf(diagnostic, Half::kAnalysis, profiles, settings)};
+ResolvedParameters resolveParameters(const DescribedDiagnostic& diagnostic, const std::vector<Profile>& profiles,
+                                     const std::vector<ParameterOverride>& settings) {
+  return {bindHalf(diagnostic, Part::kExperiment, profiles, settings),
+          bindHalf(diagnostic, Part::kAnalysis, profiles, settings)};
 }
 
-void requireParameters(const DescribedDiagnostic& diagnostic, const BoundParameters& parameters) {
-  for (const Half half : kHalves) {
-    for (const BoundParameter& one : parameters.of(half)) {
+void requireParameters(const DescribedDiagnostic& diagnostic, const ResolvedParameters& parameters) {
+  for (const Part half : kHalves) {
+    for (const ResolvedParameter& one : parameters.of(half)) {
       if (one.value || !one.declaration.required()) continue;
       const std::string name =
           diagnostic.diagnostic.experimentOnly ? one.name : formatMessage("%@.%@", nameOf(half), one.name);
-      throw Refusal(ExitCode::kUsage,
-                    formatMessage("%@ needs the parameter %@; give it with --set %@=VALUE or in a profile",
-                                  diagnostic.diagnostic.name, name, name));
+      throw CommandError(ExitCode::kUsage,
+                         formatMessage("%@ needs the parameter %@; give it with --set %@=VALUE or in a profile",
+                                       diagnostic.diagnostic.name, name, name));
     }
   }
 }

@@ -54,16 +54,16 @@ Profile profileWith(const std::string& diagnostics) {
   return parseProfile("dir/some.json", R"({"schema": 1, "diagnostics": )" + diagnostics + "}");
 }
 
-std::vector<Setting> settings(const std::vector<std::string>& texts) {
-  std::vector<Setting> parsed;
-  for (const std::string& text : texts) parsed.push_back(parseSetting(text));
+std::vector<ParameterOverride> settings(const std::vector<std::string>& texts) {
+  std::vector<ParameterOverride> parsed;
+  for (const std::string& text : texts) parsed.push_back(parseOverride(text));
   return parsed;
 }
 
 std::string refusalOf(ExitCode code, const std::function<void()>& action) {
   try {
     action();
-  } catch (const Refusal& refusal) {
+  } catch (const CommandError& refusal) {
     EXPECT_EQ(refusal.code(), code);
     return refusal.what();
   }
@@ -73,20 +73,20 @@ std::string refusalOf(ExitCode code, const std::function<void()>& action) {
 TEST(ParseSetting, TakesThePrefixAsTheHalf) {
   struct Row {
     const char* text;
-    std::optional<Half> half;
+    std::optional<Part> half;
     const char* name;
     Value value;
   };
   const Row rows[] = {
       {"duration=3", std::nullopt, "duration", 3},
-      {"experiment.duration=2.5", Half::kExperiment, "duration", 2.5},
-      {"analysis.frameCount=-1", Half::kAnalysis, "frameCount", -1},
-      {"experiment.analysis.x=1", Half::kExperiment, "analysis.x", 1},
+      {"experiment.duration=2.5", Part::kExperiment, "duration", 2.5},
+      {"analysis.frameCount=-1", Part::kAnalysis, "frameCount", -1},
+      {"experiment.analysis.x=1", Part::kExperiment, "analysis.x", 1},
       {"a.b=1", std::nullopt, "a.b", 1},
       {"experimental=1", std::nullopt, "experimental", 1},
   };
   for (const Row& row : rows) {
-    const Setting setting = parseSetting(row.text);
+    const ParameterOverride setting = parseOverride(row.text);
     EXPECT_EQ(setting.half, row.half) << row.text;
     EXPECT_EQ(setting.name, row.name) << row.text;
     EXPECT_EQ(setting.value, row.value) << row.text;
@@ -111,13 +111,13 @@ TEST(ParseSetting, RefusesOtherForms) {
       {"duration=1e999", "'1e999' is outside the range of numbers"},
   };
   for (const Row& row : kRows) {
-    EXPECT_THAT(refusalOf(ExitCode::kUsage, [&] { parseSetting(row.text); }), HasSubstr(row.problem)) << row.text;
+    EXPECT_THAT(refusalOf(ExitCode::kUsage, [&] { parseOverride(row.text); }), HasSubstr(row.problem)) << row.text;
   }
 }
 
 TEST(CheckSettings, RefusesWhatNoneOfTheDiagnosticsTakes) {
   const auto check = [](const std::vector<std::string>& texts, const std::vector<DescribedDiagnostic>& selected) {
-    return refusalOf(ExitCode::kUsage, [&] { checkSettings(settings(texts), selected); });
+    return refusalOf(ExitCode::kUsage, [&] { checkOverrides(settings(texts), selected); });
   };
   EXPECT_EQ(check({"duratoin=3"}, {sync()}),
             "--set 'duratoin=3': none of the diagnostics takes a parameter 'duratoin'; "
@@ -130,7 +130,7 @@ TEST(CheckSettings, RefusesWhatNoneOfTheDiagnosticsTakes) {
 
 TEST(CheckSettings, SpeaksOfWhatIsSelected) {
   const auto check = [](const std::string& text, const std::vector<DescribedDiagnostic>& selected) {
-    return refusalOf(ExitCode::kUsage, [&] { checkSettings(settings({text}), selected); });
+    return refusalOf(ExitCode::kUsage, [&] { checkOverrides(settings({text}), selected); });
   };
   EXPECT_EQ(check("x=3", {imagesAlone()}), "--set 'x=3': none of the experiments takes a parameter 'x'");
   EXPECT_EQ(check("analysis.images=3", {imagesAlone()}),
@@ -158,13 +158,13 @@ TEST(CheckProfile, ChecksTheEntriesOfExperimentsAgainstExperiments) {
 }
 
 TEST(CheckSettings, SaysWhenADiagnosticsParametersAreNotKnown) {
-  EXPECT_THAT(refusalOf(ExitCode::kUsage, [] { checkSettings(settings({"x=3"}), {undescribed()}); }),
+  EXPECT_THAT(refusalOf(ExitCode::kUsage, [] { checkOverrides(settings({"x=3"}), {undescribed()}); }),
               HasSubstr("(Broken could not be described: it threw)"));
 }
 
 TEST(CheckSettings, RefusesTwoSettingsOfOneParameter) {
   const auto check = [](const std::vector<std::string>& texts) {
-    return refusalOf(ExitCode::kUsage, [&] { checkSettings(settings(texts), {fault()}); });
+    return refusalOf(ExitCode::kUsage, [&] { checkOverrides(settings(texts), {fault()}); });
   };
   EXPECT_EQ(check({"timeout=3", "timeout=4"}), "--set 'timeout=3' and --set 'timeout=4' set the same parameter twice");
   EXPECT_THAT(check({"frameCount=3", "analysis.frameCount=4"}), HasSubstr("twice"));
@@ -229,7 +229,7 @@ TEST(InDoubt, IsWhatMightDeclareAParameterThatNothingDescribedDeclares) {
     const Profile profile =
         parseProfile("some.json", std::string(R"({"schema": 1, "diagnostics": )") + row.diagnostics +
                                       R"(, "experiments": )" + row.experiments + "}");
-    EXPECT_EQ(namesOf(inDoubt(profile, catalogue)), row.doubts) << row.name;
+    EXPECT_EQ(namesOf(diagnosticsToDescribe(profile, catalogue)), row.doubts) << row.name;
   }
 }
 
@@ -244,7 +244,7 @@ TEST(CheckProfile, RefusesAnEntryThatFitsNoDiagnosticOnlyWhenAllMustExist) {
 
 TEST(BindParameters, LetsASettingWinOverTheProfile) {
   const Profile profile = profileWith(R"({"Fault": {"experiment": {"frameCount": 90, "timeout": 10}}})");
-  const BoundParameters bound = bindParameters(fault(), {profile}, settings({"experiment.frameCount=5"}));
+  const ResolvedParameters bound = resolveParameters(fault(), {profile}, settings({"experiment.frameCount=5"}));
   ASSERT_EQ(bound.experiment.size(), 2U);
   EXPECT_EQ(bound.experiment[0].name, "frameCount");
   EXPECT_EQ(bound.experiment[0].value, Value(5));
@@ -262,11 +262,11 @@ TEST(BindParameters, TakesTheValueOfTheLastPlaceThatHasOne) {
         {"frameCount": 1, "timeout": 1}, "analysis": {"frameCount": 1}}}})"),
       parseProfile("mine.json", R"({"schema": 1, "diagnostics": {"*": {"experiment": {"frameCount": 2}}}})"),
       parseProfile("yours.json", R"({"schema": 1, "diagnostics": {"Fault": {"experiment": {"frameCount": 3}}}})")};
-  const Setting environment = parseSetting("experiment.frameCount=4", SettingPlace::kEnvironment);
-  const Setting commandLine = parseSetting("experiment.frameCount=5");
+  const ParameterOverride environment = parseOverride("experiment.frameCount=4", OverridePlace::kEnvironment);
+  const ParameterOverride commandLine = parseOverride("experiment.frameCount=5");
   struct Row {
     std::vector<Profile> profiles;
-    std::vector<Setting> settings;
+    std::vector<ParameterOverride> settings;
     std::optional<Value> value;
     const char* source;
   };
@@ -283,12 +283,12 @@ TEST(BindParameters, TakesTheValueOfTheLastPlaceThatHasOne) {
       {profiles, {commandLine}, 5, "command line"},
   };
   for (const Row& row : rows) {
-    const BoundParameters bound = bindParameters(fault(), row.profiles, row.settings);
+    const ResolvedParameters bound = resolveParameters(fault(), row.profiles, row.settings);
     EXPECT_EQ(bound.experiment[0].value, row.value) << row.source;
     EXPECT_EQ(bound.experiment[0].source, row.source);
   }
   // What the later places do not hold is the earlier ones'.
-  const BoundParameters bound = bindParameters(fault(), profiles, {environment, commandLine});
+  const ResolvedParameters bound = resolveParameters(fault(), profiles, {environment, commandLine});
   EXPECT_EQ(bound.experiment[1].value, Value(1));
   EXPECT_EQ(bound.experiment[1].source, "profile default.json");
   EXPECT_EQ(bound.analysis[0].value, Value(1));
@@ -303,46 +303,46 @@ class SettingsOfEnvironment : public testing::Test {
 
 TEST_F(SettingsOfEnvironment, AreSeparatedByWhiteSpace) {
   ::unsetenv(kSettingsVariable);
-  EXPECT_TRUE(settingsOfEnvironment().empty());
+  EXPECT_TRUE(overridesOfEnvironment().empty());
   set(" \t ");
-  EXPECT_TRUE(settingsOfEnvironment().empty());
+  EXPECT_TRUE(overridesOfEnvironment().empty());
   set("duration=3  analysis.frameCount=4\ttimeout=5\n");
-  const std::vector<Setting> settings = settingsOfEnvironment();
+  const std::vector<ParameterOverride> settings = overridesOfEnvironment();
   ASSERT_EQ(settings.size(), 3U);
   EXPECT_EQ(settings[0].name, "duration");
-  EXPECT_EQ(settings[1].half, Half::kAnalysis);
+  EXPECT_EQ(settings[1].half, Part::kAnalysis);
   EXPECT_EQ(settings[2].value, Value(5));
-  for (const Setting& setting : settings) EXPECT_EQ(setting.place, SettingPlace::kEnvironment);
+  for (const ParameterOverride& setting : settings) EXPECT_EQ(setting.place, OverridePlace::kEnvironment);
 }
 
 TEST_F(SettingsOfEnvironment, AreCalledByTheirVariable) {
   set("duration");
-  EXPECT_THAT(refusalOf(ExitCode::kUsage, [] { settingsOfEnvironment(); }),
+  EXPECT_THAT(refusalOf(ExitCode::kUsage, [] { overridesOfEnvironment(); }),
               HasSubstr("QUAZOR_SET 'duration': it must have the form"));
   set("duratoin=3");
-  EXPECT_EQ(refusalOf(ExitCode::kUsage, [] { checkSettings(settingsOfEnvironment(), {sync()}); }),
+  EXPECT_EQ(refusalOf(ExitCode::kUsage, [] { checkOverrides(overridesOfEnvironment(), {sync()}); }),
             "QUAZOR_SET 'duratoin=3': none of the diagnostics takes a parameter 'duratoin'; did you mean 'duration'?");
   set("duration=3 duration=4");
-  EXPECT_EQ(refusalOf(ExitCode::kUsage, [] { checkSettings(settingsOfEnvironment(), {sync()}); }),
+  EXPECT_EQ(refusalOf(ExitCode::kUsage, [] { checkOverrides(overridesOfEnvironment(), {sync()}); }),
             "QUAZOR_SET 'duration=3' and QUAZOR_SET 'duration=4' set the same parameter twice");
 }
 
 TEST_F(SettingsOfEnvironment, MaySetWhatTheCommandLineSetsToo) {
   set("duration=3");
-  std::vector<Setting> both = settingsOfEnvironment();
-  both.push_back(parseSetting("duration=4"));
-  EXPECT_EQ(refusalOf(ExitCode::kUsage, [&] { checkSettings(both, {sync()}); }), "accepted");
+  std::vector<ParameterOverride> both = overridesOfEnvironment();
+  both.push_back(parseOverride("duration=4"));
+  EXPECT_EQ(refusalOf(ExitCode::kUsage, [&] { checkOverrides(both, {sync()}); }), "accepted");
 }
 
 TEST(BindParameters, SetsAParameterWithoutPrefixWhereverItIsDeclared) {
-  const BoundParameters bound = bindParameters(fault(), {}, settings({"frameCount=7"}));
+  const ResolvedParameters bound = resolveParameters(fault(), {}, settings({"frameCount=7"}));
   EXPECT_EQ(bound.experiment[0].value, Value(7));
   EXPECT_EQ(bound.analysis[0].value, Value(7));
   EXPECT_EQ(bound.experiment[1].value, std::nullopt);
 }
 
 TEST(BindParameters, SetsAParameterWithAPrefixOnlyThere) {
-  const BoundParameters bound = bindParameters(fault(), {}, settings({"analysis.frameCount=7"}));
+  const ResolvedParameters bound = resolveParameters(fault(), {}, settings({"analysis.frameCount=7"}));
   EXPECT_EQ(bound.experiment[0].value, std::nullopt);
   EXPECT_EQ(bound.analysis[0].value, Value(7));
 }
@@ -351,20 +351,20 @@ TEST(BindParameters, GivesAnExperimentItsOwnValuesAndElseThoseOfItsDiagnostics) 
   const Profile profile = parseProfile("some.json", R"({"schema": 1,
     "diagnostics": {"Sync.*": {"experiment": {"images": 1, "timeout": 2}}, "Fault": {"experiment": {"timeout": 3}}},
     "experiments": {"Images": {"images": 4}}})");
-  BoundParameters bound = bindParameters(imagesAlone(), {profile}, {});
+  ResolvedParameters bound = resolveParameters(imagesAlone(), {profile}, {});
   ASSERT_EQ(bound.experiment.size(), 2U);
   EXPECT_EQ(bound.experiment[0].value, Value(4));
   EXPECT_EQ(bound.experiment[0].source, "profile some.json");
   EXPECT_EQ(bound.experiment[1].value, Value(3));
   EXPECT_TRUE(bound.analysis.empty());
-  bound = bindParameters(imagesAlone(), {profile}, settings({"experiment.images=9"}));
+  bound = resolveParameters(imagesAlone(), {profile}, settings({"experiment.images=9"}));
   EXPECT_EQ(bound.experiment[0].value, Value(9));
 }
 
 TEST(RequireParameters, RefusesARequiredParameterWithoutAValue) {
   const auto require = [](const DescribedDiagnostic& diagnostic, const std::vector<std::string>& texts) {
     return refusalOf(ExitCode::kUsage,
-                     [&] { requireParameters(diagnostic, bindParameters(diagnostic, {}, settings(texts))); });
+                     [&] { requireParameters(diagnostic, resolveParameters(diagnostic, {}, settings(texts))); });
   };
   EXPECT_EQ(require(sync(), {}),
             "Sync.Back needs the parameter experiment.duration; give it with "
@@ -377,7 +377,7 @@ TEST(RequireParameters, RefusesARequiredParameterWithoutAValue) {
 }
 
 TEST(DictionaryOf, HoldsOnlyWhatIsSet) {
-  const BoundParameters bound = bindParameters(fault(), {}, settings({"timeout=2"}));
+  const ResolvedParameters bound = resolveParameters(fault(), {}, settings({"timeout=2"}));
   EXPECT_EQ(dictionaryOf(bound.experiment), (Dictionary{{"timeout", 2}}));
   EXPECT_TRUE(dictionaryOf(bound.analysis).empty());
 }

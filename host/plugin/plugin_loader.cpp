@@ -18,7 +18,7 @@ namespace quazor {
 namespace {
 
 [[noreturn]] void refusePlugin(const std::filesystem::path& file, const std::string& what) {
-  throw Refusal(ExitCode::kCannotRead, "the plug-in '" + file.string() + "' " + what);
+  throw CommandError(ExitCode::kCannotRead, "the plug-in '" + file.string() + "' " + what);
 }
 
 [[noreturn]] void refuseUnlinkable(const std::filesystem::path& file, const std::string& message) {

@@ -21,7 +21,7 @@ struct LoadedPlugin {
 // Loads the plug-ins in order; each registers with the process-wide lab. A file that is named twice is loaded once.
 // Plug-ins stay loaded until the process ends, as the lab holds their factories. Returns those that were loaded.
 //
-// Throws a Refusal (kCannotRead) when a file cannot be loaded, was built against another version of the contract,
+// Throws a CommandError (kCannotRead) when a file cannot be loaded, was built against another version of the contract,
 // registers nothing or a name that is taken, or when a diagnostic names an experiment or analysis that, after all
 // plug-ins have been loaded, nobody has registered. `isNext`, unless it is empty, is told of each file before it is
 // loaded.

@@ -3,7 +3,7 @@
 #include "base/text/nearest_name.h"
 #include "contract/message_format.h"
 #include "host/error/exit_code.h"
-#include "host/plugin/catalogue.h"
+#include "host/plugin/diagnostic_registry.h"
 
 #include <nlohmann/json.hpp>
 
@@ -24,7 +24,7 @@ namespace {
 using Json = nlohmann::ordered_json;
 
 [[noreturn]] void refuseProfile(const std::filesystem::path& file, const std::string& what) {
-  throw Refusal(ExitCode::kCannotRead, "the profile '" + file.string() + "' " + what);
+  throw CommandError(ExitCode::kCannotRead, "the profile '" + file.string() + "' " + what);
 }
 
 // Parses the text, and refuses objects that hold one key twice: the parser alone would keep the last and say nothing.
@@ -74,7 +74,7 @@ OrderedMap<Value> valuesOf(const std::filesystem::path& file, const std::string&
   return values;
 }
 
-const Value* findIn(const std::vector<ProfileEntry>& entries, const std::string& name, Half half,
+const Value* findIn(const std::vector<ProfileEntry>& entries, const std::string& name, Part half,
                     std::string_view parameter) {
   const Value* found = nullptr;
   for (const ProfileEntry& entry : entries) {
@@ -88,17 +88,17 @@ const Value* findIn(const std::vector<ProfileEntry>& entries, const std::string&
 
 }  // namespace
 
-std::string_view nameOf(Half half) { return half == Half::kExperiment ? "experiment" : "analysis"; }
+std::string_view nameOf(Part half) { return half == Part::kExperiment ? "experiment" : "analysis"; }
 
-const Value* Profile::find(const std::string& diagnostic, Half half, std::string_view parameter) const {
+const Value* Profile::find(const std::string& diagnostic, Part half, std::string_view parameter) const {
   return findIn(entries, diagnostic, half, parameter);
 }
 
 const Value* Profile::findForExperiment(const std::string& experiment, const std::vector<std::string>& usedBy,
                                         std::string_view parameter) const {
-  const Value* value = findIn(experiments, experiment, Half::kExperiment, parameter);
+  const Value* value = findIn(experiments, experiment, Part::kExperiment, parameter);
   for (auto user = usedBy.begin(); value == nullptr && user != usedBy.end(); ++user) {
-    value = find(*user, Half::kExperiment, parameter);
+    value = find(*user, Part::kExperiment, parameter);
   }
   return value;
 }

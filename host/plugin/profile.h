@@ -20,16 +20,16 @@
 namespace quazor {
 
 // The two halves of a diagnostic, each with parameters of its own.
-enum class Half { kExperiment, kAnalysis };
+enum class Part { kExperiment, kAnalysis };
 
-std::string_view nameOf(Half half);  // "experiment", "analysis"
+std::string_view nameOf(Part half);  // "experiment", "analysis"
 
 struct ProfileEntry {
   std::string name;
   OrderedMap<Value> experiment;
   OrderedMap<Value> analysis;
 
-  const OrderedMap<Value>& values(Half half) const { return half == Half::kExperiment ? experiment : analysis; }
+  const OrderedMap<Value>& values(Part half) const { return half == Part::kExperiment ? experiment : analysis; }
 };
 
 struct Profile {
@@ -41,15 +41,15 @@ struct Profile {
 
   // The value for a parameter, or null. The entry with the diagnostic's own name wins over patterns, and of two
   // patterns the later one; an entry that does not hold the parameter leaves it to the others.
-  const Value* find(const std::string& diagnostic, Half half, std::string_view parameter) const;
+  const Value* find(const std::string& diagnostic, Part half, std::string_view parameter) const;
   // The same for a parameter of an experiment that runs on its own. What its entries do not hold comes from the first
   // of the diagnostics `usedBy` that has a value for it.
   const Value* findForExperiment(const std::string& experiment, const std::vector<std::string>& usedBy,
                                  std::string_view parameter) const;
 };
 
-// Reads a profile. Throws a Refusal (kCannotRead) that names the file and the place when it cannot be read or is not
-// exactly of the form above.
+// Reads a profile. Throws a CommandError (kCannotRead) that names the file and the place when it cannot be read or is
+// not exactly of the form above.
 Profile readProfile(const std::filesystem::path& file);
 
 // As readProfile, from the file's text.

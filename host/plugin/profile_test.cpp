@@ -15,7 +15,7 @@ constexpr const char* kFile = "some.json";
 std::string refusalOf(const std::string& text) {
   try {
     parseProfile(kFile, text);
-  } catch (const Refusal& refusal) {
+  } catch (const CommandError& refusal) {
     EXPECT_EQ(refusal.code(), ExitCode::kCannotRead);
     return refusal.what();
   }
@@ -123,14 +123,14 @@ TEST(Profile, FindsTheValueForAnExperiment) {
     const Value* value = profile.findForExperiment(row.experiment, row.usedBy, row.parameter);
     EXPECT_EQ(value == nullptr ? std::nullopt : std::optional(*value), row.value) << row.name;
   }
-  EXPECT_EQ(profile.find("E.One", Half::kExperiment, "x"), nullptr);
+  EXPECT_EQ(profile.find("E.One", Part::kExperiment, "x"), nullptr);
 }
 
 TEST(ReadProfile, RefusesAFileThatIsNotThereAndADirectory) {
   const auto problemOf = [](const char* file) {
     try {
       readProfile(file);
-    } catch (const Refusal& refusal) {
+    } catch (const CommandError& refusal) {
       return std::string(refusal.what());
     }
     return std::string("accepted");
@@ -148,19 +148,19 @@ TEST(Profile, FindsTheValueOfTheEntryThatWins) {
   struct Row {
     const char* name;
     const char* diagnostic;
-    Half half;
+    Part half;
     const char* parameter;
     std::optional<Value> value;
   };
   const Row rows[] = {
-      {"the diagnostic's own entry wins over a later pattern", "A.One", Half::kExperiment, "x", Value(1)},
-      {"a pattern gives what the own entry leaves out", "A.One", Half::kExperiment, "y", Value(3)},
-      {"a pattern's value", "A.Else", Half::kExperiment, "x", Value(2)},
-      {"the later of two patterns wins", "A.Two", Half::kExperiment, "x", Value(5)},
-      {"the earlier pattern gives what the later leaves out", "A.Two", Half::kExperiment, "y", Value(3)},
-      {"the other half has its own values", "A.Two", Half::kAnalysis, "x", Value(4)},
-      {"a parameter that no entry holds", "A.One", Half::kAnalysis, "y", std::nullopt},
-      {"a diagnostic that no entry fits", "B.One", Half::kExperiment, "x", std::nullopt},
+      {"the diagnostic's own entry wins over a later pattern", "A.One", Part::kExperiment, "x", Value(1)},
+      {"a pattern gives what the own entry leaves out", "A.One", Part::kExperiment, "y", Value(3)},
+      {"a pattern's value", "A.Else", Part::kExperiment, "x", Value(2)},
+      {"the later of two patterns wins", "A.Two", Part::kExperiment, "x", Value(5)},
+      {"the earlier pattern gives what the later leaves out", "A.Two", Part::kExperiment, "y", Value(3)},
+      {"the other half has its own values", "A.Two", Part::kAnalysis, "x", Value(4)},
+      {"a parameter that no entry holds", "A.One", Part::kAnalysis, "y", std::nullopt},
+      {"a diagnostic that no entry fits", "B.One", Part::kExperiment, "x", std::nullopt},
   };
   for (const Row& row : rows) {
     const Value* value = profile.find(row.diagnostic, row.half, row.parameter);

@@ -17,7 +17,7 @@ namespace {
 
 constexpr std::string_view kDigits = "0123456789abcdef";
 // Of values in values: more than anything needs, and few enough for the stack.
-constexpr int kMostLevels = 500;
+constexpr int kMaxLevels = 500;
 
 class DescribedObject final : public Object {
  public:
@@ -221,7 +221,7 @@ Json losslessValue(const Value& value) {
   return tagged("array", std::move(elements));
 }
 
-Value valueFrom(const Json& json) { return nestedValueFrom(json, kMostLevels); }
+Value valueFrom(const Json& json) { return nestedValueFrom(json, kMaxLevels); }
 
 Json losslessDictionary(const Dictionary& dictionary) {
   Json entries = Json::array();
@@ -229,7 +229,7 @@ Json losslessDictionary(const Dictionary& dictionary) {
   return entries;
 }
 
-Dictionary dictionaryFrom(const Json& json) { return nestedDictionaryFrom(json, kMostLevels); }
+Dictionary dictionaryFrom(const Json& json) { return nestedDictionaryFrom(json, kMaxLevels); }
 
 Json losslessError(const DiagnosticErrorPtr& error) {
   if (error == nullptr) return {};
@@ -238,7 +238,7 @@ Json losslessError(const DiagnosticErrorPtr& error) {
           {"userInfo", losslessDictionary(error->userInfo())}};
 }
 
-DiagnosticErrorPtr errorFrom(const Json& json) { return nestedErrorFrom(json, kMostLevels); }
+DiagnosticErrorPtr errorFrom(const Json& json) { return nestedErrorFrom(json, kMaxLevels); }
 
 Json losslessMeasurement(const Measurement& measurement) {
   return Json::array({losslessNumber(measurement.value()), losslessText(measurement.unit().symbol())});

@@ -24,7 +24,8 @@ using Json = nlohmann::ordered_json;
 constexpr mode_t kMode = 0666;  // less the umask
 
 [[noreturn]] void refuseLine(const std::filesystem::path& file, std::uint64_t line, const std::string& why) {
-  throw Refusal(ExitCode::kCannotRead, "the record '" + file.string() + "', line " + std::to_string(line) + ": " + why);
+  throw CommandError(ExitCode::kCannotRead,
+                     "the record '" + file.string() + "', line " + std::to_string(line) + ": " + why);
 }
 
 RunEvent eventInLine(const std::filesystem::path& file, std::uint64_t sequence, const std::string& line) {
@@ -61,7 +62,7 @@ std::string recordLine(const RunEvent& event, std::uint64_t sequence) {
 
 RecordWriter::RecordWriter(std::filesystem::path file) : file_(std::move(file)) {
   const auto refuse = [this](const std::string& why) {
-    throw Refusal(ExitCode::kCannotWrite, "the record '" + file_.string() + "' cannot be written: " + why);
+    throw CommandError(ExitCode::kCannotWrite, "the record '" + file_.string() + "' cannot be written: " + why);
   };
   std::error_code ignored;
   if (std::filesystem::is_directory(file_, ignored)) refuse("it is a directory");
@@ -111,8 +112,8 @@ StoredRecord readRecord(const std::filesystem::path& file) {
   std::ifstream stream(file, std::ios::binary);
   std::error_code ignored;
   if (!stream || std::filesystem::is_directory(file, ignored)) {
-    throw Refusal(ExitCode::kCannotRead, "the record '" + file.string() + "' cannot be read: " +
-                                             (stream ? "it is a directory" : std::strerror(errno)));
+    throw CommandError(ExitCode::kCannotRead, "the record '" + file.string() + "' cannot be read: " +
+                                                  (stream ? "it is a directory" : std::strerror(errno)));
   }
   StoredRecord stored;
   std::string line;
@@ -124,9 +125,10 @@ StoredRecord readRecord(const std::filesystem::path& file) {
     stored.events.push_back(eventInLine(file, stored.events.size(), line));
   }
   if (stream.bad())
-    throw Refusal(ExitCode::kCannotRead, "the record '" + file.string() + "' cannot be read to its end");
-  if (stored.events.empty()) throw Refusal(ExitCode::kCannotRead, "the record '" + file.string() + "' holds no event");
-  if (!std::holds_alternative<RunBegan>(stored.events.front())) {
+    throw CommandError(ExitCode::kCannotRead, "the record '" + file.string() + "' cannot be read to its end");
+  if (stored.events.empty())
+    throw CommandError(ExitCode::kCannotRead, "the record '" + file.string() + "' holds no event");
+  if (!std::holds_alternative<RunStarted>(stored.events.front())) {
     refuseLine(file, 1, "a record begins with the event runBegan");
   }
   return stored;
@@ -138,7 +140,7 @@ RecordedRun runIn(const std::filesystem::path& file) {
   RecordBuilder builder;
   for (const RunEvent& event : stored.events) {
     builder.take(event);
-    if (const auto* const began = std::get_if<RunBegan>(&event)) run.began = *began;
+    if (const auto* const began = std::get_if<RunStarted>(&event)) run.began = *began;
     if (const auto* const ended = std::get_if<RunEnded>(&event)) run.ended = *ended;
     if (std::holds_alternative<DiagnosticEnded>(event)) run.records.push_back(builder.takeRecord());
   }

@@ -21,7 +21,8 @@ std::string recordLine(const RunEvent& event, std::uint64_t sequence);
 // without an end.
 class RecordWriter final : public RunEventSink {
  public:
-  // A new file takes the place of one of that name at once. Throws a Refusal (kCannotWrite) when it cannot be made.
+  // A new file takes the place of one of that name at once. Throws a CommandError (kCannotWrite) when it cannot be
+  // made.
   explicit RecordWriter(std::filesystem::path file);
   ~RecordWriter() override;
 
@@ -49,12 +50,12 @@ struct StoredRecord {
   bool cutOff = false;  // its last line has no end, and is not among the events
 };
 
-// Throws a Refusal (kCannotRead) that names file and line when the file cannot be read or is no record.
+// Throws a CommandError (kCannotRead) that names file and line when the file cannot be read or is no record.
 StoredRecord readRecord(const std::filesystem::path& file);
 
 // The diagnostics of a record that it does not hold to the end have the verdict kError.
 struct RecordedRun {
-  RunBegan began;
+  RunStarted began;
   std::vector<DiagnosticRecord> records;
   std::optional<RunEnded> ended;  // nothing: the run did not come to its end
 };

@@ -29,7 +29,7 @@ using testing::StartsWith;
 std::string refusalOf(ExitCode code, const std::function<void()>& action) {
   try {
     action();
-  } catch (const Refusal& refusal) {
+  } catch (const CommandError& refusal) {
     EXPECT_EQ(refusal.code(), code);
     return refusal.what();
   }
@@ -100,7 +100,7 @@ TEST_F(RecordFileTest, HoldsEachEventAsSoonAsItWasTaken) {
 
 TEST_F(RecordFileTest, GivesTheWholeLinesOfARecordThatWasCutOffAnywhere) {
   const std::vector<RunEvent> events = {
-      runOf({"A\n\u00e4"}), beginningOf("A\n\u00e4"), StageBegan{Stage::kRun, momentAt(2)},
+      runOf({"A\n\u00e4"}), beginningOf("A\n\u00e4"), StageStarted{Stage::kRun, momentAt(2)},
       DiagnosticEnded{Verdict::kError, momentAt(3)}, RunEnded{std::nullopt, momentAt(4)}};
   write(events);
   const std::string whole = directory_.read("record");

@@ -66,9 +66,9 @@ std::vector<std::string> textsAt(const Json& json, const char* key) {
   return texts;
 }
 
-Json parametersJson(const std::vector<BoundParameter>& parameters) {
+Json parametersJson(const std::vector<ResolvedParameter>& parameters) {
   Json json = Json::array();
-  for (const BoundParameter& one : parameters) {
+  for (const ResolvedParameter& one : parameters) {
     Json parameter = {{"name", losslessText(one.name)},
                       {"summary", losslessText(one.declaration.summary())},
                       {"required", one.declaration.required()}};
@@ -81,10 +81,10 @@ Json parametersJson(const std::vector<BoundParameter>& parameters) {
   return json;
 }
 
-std::vector<BoundParameter> parametersAt(const Json& json, const char* key) {
-  std::vector<BoundParameter> parameters;
+std::vector<ResolvedParameter> parametersAt(const Json& json, const char* key) {
+  std::vector<ResolvedParameter> parameters;
   for (const Json& one : arrayAt(json, key)) {
-    BoundParameter parameter{
+    ResolvedParameter parameter{
         textAt(one, "name"), QZNumberParameter(textAt(one, "summary"), get<bool>(one, "required")), std::nullopt, {}};
     if (one.contains("value")) {
       parameter.value = valueFrom(one["value"]);
@@ -117,7 +117,7 @@ std::chrono::nanoseconds nanosecondsAt(const Json& json, const char* key) {
 
 // One overload per event, each the reverse of its read function below.
 
-Json jsonOf(const RunBegan& event) {
+Json jsonOf(const RunStarted& event) {
   return {{"event", "runBegan"},
           {"program", event.program},
           {"contract", event.contract},
@@ -130,12 +130,12 @@ Json jsonOf(const RunBegan& event) {
 }
 
 RunEvent readRunBegan(const Json& json) {
-  return RunBegan{textAt(json, "program"),          get<int>(json, "contract"), dateAt(json, "date"),
-                  textsAt(json, "plugins"),         textAt(json, "phone"),      get<std::uint64_t>(json, "seed"),
-                  get<bool>(json, "ofExperiments"), textsAt(json, "names")};
+  return RunStarted{textAt(json, "program"),          get<int>(json, "contract"), dateAt(json, "date"),
+                    textsAt(json, "plugins"),         textAt(json, "phone"),      get<std::uint64_t>(json, "seed"),
+                    get<bool>(json, "ofExperiments"), textsAt(json, "names")};
 }
 
-Json jsonOf(const DiagnosticBegan& event) {
+Json jsonOf(const DiagnosticStarted& event) {
   return {{"event", "diagnosticBegan"},
           {"name", losslessText(event.name)},
           {"summary", losslessText(event.summary)},
@@ -151,21 +151,21 @@ Json jsonOf(const DiagnosticBegan& event) {
 
 RunEvent readDiagnosticBegan(const Json& json) {
   const Json& parameters = memberOf(json, "parameters");
-  return DiagnosticBegan{textAt(json, "name"),
-                         textAt(json, "summary"),
-                         textAt(json, "experiment"),
-                         textAt(json, "analysis"),
-                         get<bool>(json, "experimentOnly"),
-                         {parametersAt(parameters, "experiment"), parametersAt(parameters, "analysis")},
-                         get<std::uint64_t>(json, "seed"),
-                         dateAt(json, "date")};
+  return DiagnosticStarted{textAt(json, "name"),
+                           textAt(json, "summary"),
+                           textAt(json, "experiment"),
+                           textAt(json, "analysis"),
+                           get<bool>(json, "experimentOnly"),
+                           {parametersAt(parameters, "experiment"), parametersAt(parameters, "analysis")},
+                           get<std::uint64_t>(json, "seed"),
+                           dateAt(json, "date")};
 }
 
-Json jsonOf(const StageBegan& event) {
+Json jsonOf(const StageStarted& event) {
   return {{"event", "stageBegan"}, {"stage", nameOf(event.stage)}, {"date", timestampText(event.date)}};
 }
 
-RunEvent readStageBegan(const Json& json) { return StageBegan{stageAt(json, "stage"), dateAt(json, "date")}; }
+RunEvent readStageBegan(const Json& json) { return StageStarted{stageAt(json, "stage"), dateAt(json, "date")}; }
 
 Json jsonOf(const StageEnded& event) {
   Json json = {{"event", "stageEnded"}, {"stage", nameOf(event.stage)}};
@@ -193,7 +193,7 @@ RunEvent readLogged(const Json& json) {
       {nanosecondsAt(json, "nanoseconds"), levelAt(json, "level"), textAt(json, "text"), dateAt(json, "date")}};
 }
 
-Json jsonOf(const Measured& event) {
+Json jsonOf(const MeasurementsAdded& event) {
   Json measurements = Json::array();
   for (const auto& [name, measurement] : event.measurements) {
     measurements.push_back(Json::array({losslessText(name), losslessMeasurement(measurement)}));
@@ -202,7 +202,7 @@ Json jsonOf(const Measured& event) {
 }
 
 RunEvent readMeasured(const Json& json) {
-  Measured event;
+  MeasurementsAdded event;
   for (const Json& one : arrayAt(json, "measurements")) {
     if (!one.is_array() || one.size() != 2) throw BadRecord("a measurement has not a name and a value");
     event.measurements.emplace_back(textFrom(one[0]), measurementFrom(one[1]));
@@ -210,20 +210,22 @@ RunEvent readMeasured(const Json& json) {
   return event;
 }
 
-Json jsonOf(const Collected& event) {
+Json jsonOf(const AuxiliaryDataAdded& event) {
   return {{"event", "collected"}, {"key", losslessText(event.key)}, {"value", losslessValue(event.value)}};
 }
 
-RunEvent readCollected(const Json& json) { return Collected{textAt(json, "key"), valueFrom(memberOf(json, "value"))}; }
+RunEvent readCollected(const Json& json) {
+  return AuxiliaryDataAdded{textAt(json, "key"), valueFrom(memberOf(json, "value"))};
+}
 
-Json jsonOf(const Found& event) {
+Json jsonOf(const ResultsReported& event) {
   Json results = Json::array();
   for (const QZMeasuredResult& result : event.results) results.push_back(losslessResult(result));
   return {{"event", "found"}, {"results", std::move(results)}};
 }
 
 RunEvent readFound(const Json& json) {
-  Found event;
+  ResultsReported event;
   for (const Json& one : arrayAt(json, "results")) event.results.push_back(resultFrom(one));
   return event;
 }

@@ -35,10 +35,10 @@ struct Row {
 
 // Each event with everything that it can have.
 std::vector<Row> rows() {
-  RunBegan run = runOf({"Good", "B\xff"});
+  RunStarted run = runOf({"Good", "B\xff"});
   run.ofExperiments = true;
   run.seed = UINT64_MAX;
-  DiagnosticBegan diagnostic = beginningOf("Good");
+  DiagnosticStarted diagnostic = beginningOf("Good");
   diagnostic.experimentOnly = true;
   const DiagnosticErrorPtr error = errorWithMessage("D", -2, "m", nullptr);
   return {
@@ -50,16 +50,17 @@ std::vector<Row> rows() {
        R"("experimentOnly":true,"parameters":{"experiment":[{"name":"duration","summary":"How long.",)"
        R"("required":true,"value":{"signed":3},"source":"command line"}],"analysis":[{"name":"gain",)"
        R"("summary":"How much.","required":false}]},"seed":5,"date":"2026-11-21T01:08:00.001000000Z"})"},
-      {StageBegan{Stage::kTeardown, momentAt(7)},
+      {StageStarted{Stage::kTeardown, momentAt(7)},
        R"({"event":"stageBegan","stage":"teardown","date":"2026-11-21T01:08:00.007000000Z"})"},
       {StageEnded{Stage::kRun, 3s, momentAt(7)},
        R"({"event":"stageEnded","stage":"run","nanoseconds":3000000000,"date":"2026-11-21T01:08:00.007000000Z"})"},
       {Logged{{-1ns, LogLevel::kDebug, "a\nline", momentAt(7)}},
        R"({"event":"log","date":"2026-11-21T01:08:00.007000000Z","nanoseconds":-1,"level":"debug","text":"a\nline"})"},
-      {Measured{{{"R", Measurement(0.5, QZUnit::unitWithSymbol("V"))}}},
+      {MeasurementsAdded{{{"R", Measurement(0.5, QZUnit::unitWithSymbol("V"))}}},
        R"({"event":"measured","measurements":[["R",[0.5,"V"]]]})"},
-      {Collected{"k", Value(Array{1U})}, R"({"event":"collected","key":"k","value":{"array":[{"unsigned":1}]}})"},
-      {Found{{QZMeasuredResult("R", Measurement(1, QZUnit::unitWithSymbol("V")))}},
+      {AuxiliaryDataAdded{"k", Value(Array{1U})},
+       R"({"event":"collected","key":"k","value":{"array":[{"unsigned":1}]}})"},
+      {ResultsReported{{QZMeasuredResult("R", Measurement(1, QZUnit::unitWithSymbol("V")))}},
        R"({"event":"found","results":[{"name":"R","measurement":[1.0,"V"]}]})"},
       {Failed{Stage::kSetup, error}, R"({"event":"failed","stage":"setup","error":{"domain":"D","code":-2,)"
                                      R"("userInfo":[["localized-description",{"string":"m"}]]}})"},
@@ -92,8 +93,8 @@ TEST(EventFrom, ReadsBackWhatIsLeftOut) {
       Failed{std::nullopt, errorWithMessage("D", 1, "m", nullptr)},
       RunEnded{std::nullopt, momentAt(7)},
       RunEnded{"", momentAt(7)},
-      Measured{},
-      Found{},
+      MeasurementsAdded{},
+      ResultsReported{},
       FaultsCounted{},
   };
   for (const RunEvent& event : events) {
@@ -108,17 +109,17 @@ TEST(EventFrom, KeepsEveryContent) {
   for (int i = 0; i < 1000; ++i) {
     const std::string key = random.text();
     const Value value = random.value(3);
-    const auto collected = std::get<Collected>(back(Collected{key, value}));
+    const auto collected = std::get<AuxiliaryDataAdded>(back(AuxiliaryDataAdded{key, value}));
     ASSERT_EQ(collected.key, key);
     ASSERT_TRUE(isSame(collected.value, value));
 
     const QZMeasuredResult result = random.result();
-    const auto found = std::get<Found>(back(Found{{result, result}}));
+    const auto found = std::get<ResultsReported>(back(ResultsReported{{result, result}}));
     ASSERT_EQ(found.results.size(), 2U);
     ASSERT_TRUE(isSame(found.results[1], result));
 
     const Measurement measurement = random.measurement();
-    const auto measured = std::get<Measured>(back(Measured{{{key, measurement}}}));
+    const auto measured = std::get<MeasurementsAdded>(back(MeasurementsAdded{{{key, measurement}}}));
     ASSERT_EQ(measured.measurements[0].first, key);
     ASSERT_TRUE(isSame(measured.measurements[0].second, measurement));
 
@@ -137,7 +138,7 @@ TEST(EventFrom, KeepsEveryContent) {
 
 TEST(EventFrom, KnowsEveryStageLevelAndVerdict) {
   for (const Stage stage : kStages) {
-    EXPECT_EQ(std::get<StageBegan>(back(StageBegan{stage, momentAt(1)})).stage, stage);
+    EXPECT_EQ(std::get<StageStarted>(back(StageStarted{stage, momentAt(1)})).stage, stage);
   }
   for (const LogLevel level : {LogLevel::kError, LogLevel::kDefault, LogLevel::kDebug}) {
     EXPECT_EQ(std::get<Logged>(back(Logged{{1ns, level, "", momentAt(1)}})).line.level, level);

@@ -34,7 +34,7 @@ class Verifier {
     }
     checkPlace(event);
     builder_.take(event);
-    if (std::holds_alternative<DiagnosticBegan>(event)) hostsWord_ = nullptr;
+    if (std::holds_alternative<DiagnosticStarted>(event)) hostsWord_ = nullptr;
     if (std::holds_alternative<DiagnosticEnded>(event)) checkVerdict();
   }
 
@@ -43,8 +43,8 @@ class Verifier {
  private:
   void checkPlace(const RunEvent& event) {
     if (ended_) add("there are events after the end of the run");
-    const bool begins = std::holds_alternative<DiagnosticBegan>(event);
-    if (const auto* const began = std::get_if<RunBegan>(&event)) {
+    const bool begins = std::holds_alternative<DiagnosticStarted>(event);
+    if (const auto* const began = std::get_if<RunStarted>(&event)) {
       if (began_) add("the run begins twice");
       began_ = true;
       toRun_ = began->names;

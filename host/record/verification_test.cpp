@@ -23,7 +23,7 @@ using Events = std::vector<RunEvent>;
 template <class Event>
 Events::iterator find(Events& events, const std::string& diagnostic) {
   const auto begin = std::find_if(events.begin(), events.end(), [&](const RunEvent& event) {
-    const auto* const began = std::get_if<DiagnosticBegan>(&event);
+    const auto* const began = std::get_if<DiagnosticStarted>(&event);
     return began != nullptr && began->name == diagnostic;
   });
   return std::find_if(begin, events.end(), [](const RunEvent& event) { return std::holds_alternative<Event>(event); });
@@ -36,7 +36,7 @@ std::vector<std::string> problemsAfter(const std::function<void(Events&)>& chang
 }
 
 void replaceResult(Events& events, const std::string& diagnostic, const QZMeasuredResult& result) {
-  std::get<Found>(*find<Found>(events, diagnostic)).results[0] = result;
+  std::get<ResultsReported>(*find<ResultsReported>(events, diagnostic)).results[0] = result;
 }
 
 QZMeasuredResult withUnit(const char* unit) {
@@ -95,10 +95,11 @@ TEST(ProblemsOf, FindsChangesOfWhatTheVerdictFollowsFrom) {
        "Strange has the failure QuazorHostErrorDomain 5"},
       {"a limit", [](Events& e) { replaceResult(e, "Good", withMinimum(91)); }, "Good has the verdict pass"},
       {"a unit", [](Events& e) { replaceResult(e, "Good", withUnit("errors")); }, "Good has the verdict pass"},
-      {"no result any more", [](Events& e) { e.erase(find<Found>(e, "Good")); }, "Good has the verdict pass"},
-      {"no failing result any more", [](Events& e) { e.erase(find<Found>(e, "Bad")); }, "Bad has the verdict fail"},
+      {"no result any more", [](Events& e) { e.erase(find<ResultsReported>(e, "Good")); }, "Good has the verdict pass"},
+      {"no failing result any more", [](Events& e) { e.erase(find<ResultsReported>(e, "Bad")); },
+       "Bad has the verdict fail"},
       {"another result that fails",
-       [](Events& e) { std::get<Found>(*find<Found>(e, "Good")).results.push_back(resultOf(1)); },
+       [](Events& e) { std::get<ResultsReported>(*find<ResultsReported>(e, "Good")).results.push_back(resultOf(1)); },
        "Good has the verdict pass"},
       {"an error that was not",
        [](Events& e) {
@@ -183,7 +184,7 @@ TEST(ProblemsOf, FindsEventsThatAreOutOfPlace) {
 
 TEST(ProblemsOf, FindsADiagnosticThatWasTakenOut) {
   const auto without = [](Events& events) {
-    events.erase(find<DiagnosticBegan>(events, "Bad"), find<DiagnosticBegan>(events, "Strange"));
+    events.erase(find<DiagnosticStarted>(events, "Bad"), find<DiagnosticStarted>(events, "Strange"));
   };
   EXPECT_THAT(problemsAfter(without), ElementsAre("Bad was to run and is missing"));
   EXPECT_THAT(problemsAfter([&](Events& events) {

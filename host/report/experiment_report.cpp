@@ -18,8 +18,8 @@ namespace {
 
 constexpr std::size_t kWidth = 80;
 // Fewer samples are easier to read as numbers; more columns do not fit.
-constexpr std::size_t kFewestDrawn = 8;
-constexpr std::size_t kMostDrawn = 64;
+constexpr std::size_t kMinDrawn = 8;
+constexpr std::size_t kMaxDrawn = 64;
 
 // "min 1, max 9": the lowest and the highest that are finite, as they are.
 std::string rangeOf(const Array& samples) {
@@ -66,7 +66,7 @@ class AuxiliaryPrinter {
     } else if (value.dictionary() != nullptr && !value.dictionary()->empty()) {
       out_ << indent << name << ":\n";
       for (const auto& [key, entry] : *value.dictionary()) printEntry(printable(key), entry, indent + "  ");
-    } else if (isSamples(value) && value.array()->size() >= kFewestDrawn) {
+    } else if (isSamples(value) && value.array()->size() >= kMinDrawn) {
       printSamples(name, *value.array(), indent);
     } else if (isNested(value)) {
       const Array& elements = *value.array();
@@ -102,7 +102,7 @@ class AuxiliaryPrinter {
 
   void printSamples(const std::string& name, const Array& samples, const std::string& indent) const {
     out_ << indent << name << ": " << samples.size() << " samples, " << rangeOf(samples) << '\n';
-    if (samples.size() > kMostDrawn) return;
+    if (samples.size() > kMaxDrawn) return;
     std::vector<double> numbers;
     numbers.reserve(samples.size());
     for (const Value& sample : samples) numbers.push_back(toDouble(&sample));

@@ -49,7 +49,7 @@ Json measurementsJson(const OrderedMap<Measurement>& measurements) {
   });
 }
 
-Json parametersJson(const BoundParameters& parameters) {
+Json parametersJson(const ResolvedParameters& parameters) {
   return {{"experiment", dictionaryJson(dictionaryOf(parameters.experiment))},
           {"analysis", dictionaryJson(dictionaryOf(parameters.analysis))}};
 }
@@ -78,9 +78,9 @@ Json durationJson(const std::optional<std::chrono::nanoseconds>& duration) {
 
 // What a half declares, with the values of a run.
 Json declarationJson(const std::string& name, const QZDescription& description,
-                     const std::vector<BoundParameter>& parameters) {
+                     const std::vector<ResolvedParameter>& parameters) {
   Json json = Json::array();
-  for (const BoundParameter& one : parameters) {
+  for (const ResolvedParameter& one : parameters) {
     json.push_back({{"name", one.name},
                     {"summary", one.declaration.summary()},
                     {"required", one.declaration.required()},
@@ -160,7 +160,7 @@ Json listDocument(const std::vector<DescribedDiagnostic>& diagnostics) {
   return document;
 }
 
-Json descriptionDocument(const std::vector<BoundDiagnostic>& diagnostics) {
+Json descriptionDocument(const std::vector<ResolvedDiagnostic>& diagnostics) {
   Json document = documentOf("diagnostics", Json::array());
   document["experiments"] = Json::array();
   for (const auto& [described, parameters] : diagnostics) {

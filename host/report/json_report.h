@@ -2,7 +2,7 @@
 #pragma once
 
 #include "host/model/diagnostic_record.h"
-#include "host/plugin/catalogue.h"
+#include "host/plugin/diagnostic_registry.h"
 #include "host/plugin/parameters.h"
 
 #include <nlohmann/json.hpp>
@@ -30,6 +30,6 @@ nlohmann::ordered_json experimentDocument(const std::vector<DiagnosticRecord>& r
 nlohmann::ordered_json listDocument(const std::vector<DescribedDiagnostic>& diagnostics);
 
 // The document of descriptions.
-nlohmann::ordered_json descriptionDocument(const std::vector<BoundDiagnostic>& diagnostics);
+nlohmann::ordered_json descriptionDocument(const std::vector<ResolvedDiagnostic>& diagnostics);
 
 }  // namespace quazor

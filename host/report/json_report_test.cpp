@@ -135,7 +135,7 @@ TEST(ListDocument, NamesDiagnosticsAndTheirHalvesAndExperimentsApart) {
 }
 
 TEST(DescriptionDocument, HoldsExperimentsApart) {
-  BoundDiagnostic bound;
+  ResolvedDiagnostic bound;
   bound.described = experimentAlone();
   bound.parameters.experiment.push_back({"x", QZNumberParameter("About x.", true), Value(2.5), "profile p.json"});
   EXPECT_EQ(descriptionDocument({bound}), Json::parse(R"({"schema": 1, "diagnostics": [], "experiments": [
@@ -145,7 +145,7 @@ TEST(DescriptionDocument, HoldsExperimentsApart) {
 }
 
 TEST(DescriptionDocument, HoldsDeclarationsAndValues) {
-  BoundDiagnostic bound;
+  ResolvedDiagnostic bound;
   bound.described.diagnostic = {"D", "S.", "E", "A", nullptr, nullptr};
   bound.described.description = {QZDescription("About E."), QZDescription("About A."), nullptr};
   bound.parameters.experiment.push_back({"x", QZNumberParameter("About x.", true), Value(2.5), "profile p.json"});
@@ -160,7 +160,7 @@ TEST(DescriptionDocument, HoldsDeclarationsAndValues) {
 }
 
 TEST(DescriptionDocument, TellsWhyADiagnosticCannotBeDescribed) {
-  BoundDiagnostic bound;
+  ResolvedDiagnostic bound;
   bound.described.description.error = hostError(HostErrorCode::kException, "it threw");
   EXPECT_EQ(descriptionDocument({bound})["diagnostics"][0]["error"]["message"], "it threw");
 }

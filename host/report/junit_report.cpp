@@ -2,7 +2,7 @@
 
 #include "contract/message_format.h"
 #include "host/error/host_error.h"
-#include "host/model/unfinished.h"
+#include "host/model/incomplete_run.h"
 #include "host/report/junit_suite.h"
 #include "host/report/text_report.h"
 
@@ -16,8 +16,9 @@ std::string valueText(const Measurement& measurement) {
   return formatMessage("%@ %@", measurement.value(), measurement.unit().symbol());
 }
 
-void addParameters(JUnitProperties& properties, std::string_view half, const std::vector<BoundParameter>& parameters) {
-  for (const BoundParameter& one : parameters) {
+void addParameters(JUnitProperties& properties, std::string_view half,
+                   const std::vector<ResolvedParameter>& parameters) {
+  for (const ResolvedParameter& one : parameters) {
     if (!one.value) continue;
     properties.add(formatMessage("parameter.%@.%@", half, one.name), defaultText(*one.value));
     properties.add(formatMessage("source.%@.%@", half, one.name), one.source);
@@ -66,14 +67,14 @@ void addExperiment(JUnitSuite& suite, const DiagnosticRecord& record) {
   suite.addPass("result", properties);
 }
 
-void addRun(JUnitProperties& properties, const RunBegan& run) {
+void addRun(JUnitProperties& properties, const RunStarted& run) {
   properties.add("program", run.program);
   properties.add("contract", std::to_string(run.contract));
   for (const std::string& plugin : run.plugins) properties.add("plugin", plugin);
   properties.add("phone", run.phone);
 }
 
-JUnitSuite suiteOf(const RunBegan& run, const DiagnosticRecord& record) {
+JUnitSuite suiteOf(const RunStarted& run, const DiagnosticRecord& record) {
   JUnitSuite suite(record.name, record.begin, record.end);
   JUnitProperties& properties = suite.properties();
   properties.add("verdict", std::string(nameOf(record.verdict)));
@@ -91,7 +92,7 @@ JUnitSuite suiteOf(const RunBegan& run, const DiagnosticRecord& record) {
   return suite;
 }
 
-JUnitSuite suiteOfUnfinished(const RunBegan& run, const std::string& name, Date date) {
+JUnitSuite suiteOfUnfinished(const RunStarted& run, const std::string& name, Date date) {
   JUnitSuite suite(name, date, date);
   suite.properties().add("seed", std::to_string(run.seed));
   addRun(suite.properties(), run);
@@ -100,7 +101,7 @@ JUnitSuite suiteOfUnfinished(const RunBegan& run, const std::string& name, Date 
 
 }  // namespace
 
-std::string junitReport(const RunBegan& run, const std::vector<DiagnosticRecord>& records,
+std::string junitReport(const RunStarted& run, const std::vector<DiagnosticRecord>& records,
                         const std::optional<std::string>& interrupted) {
   JUnitCounts counts;
   std::string suites;

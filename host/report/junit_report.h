@@ -15,7 +15,7 @@ namespace quazor {
 //
 // In a suite an error counts more than a failure, and a failure more than a pass; one that has neither an error nor a
 // failure has passed, unless all it has was skipped.
-std::string junitReport(const RunBegan& run, const std::vector<DiagnosticRecord>& records,
+std::string junitReport(const RunStarted& run, const std::vector<DiagnosticRecord>& records,
                         const std::optional<std::string>& interrupted);
 
 }  // namespace quazor

@@ -15,8 +15,8 @@ using testing::AllOf;
 using testing::HasSubstr;
 using testing::Not;
 
-RunBegan run() {
-  RunBegan run;
+RunStarted run() {
+  RunStarted run;
   run.program = "0.1.0";
   run.contract = 2;
   run.plugins = {"p.so"};
@@ -147,7 +147,7 @@ TEST(JUnitReport, AddsTheSuitesUp) {
 }
 
 TEST(JUnitReport, TellsWhatWasInterruptedAndWhatNeverRan) {
-  RunBegan three = run();
+  RunStarted three = run();
   three.names = {"Diagnostic", "Second", "Third"};
   const std::string report = junitReport(three, {record(Verdict::kPass)}, "Second");
   EXPECT_THAT(report,

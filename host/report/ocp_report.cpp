@@ -2,7 +2,7 @@
 
 #include "contract/message_format.h"
 #include "host/device/phone.h"
-#include "host/model/unfinished.h"
+#include "host/model/incomplete_run.h"
 #include "host/record/value_json.h"
 #include "host/report/ocp_stream.h"
 #include "host/report/text_report.h"
@@ -48,14 +48,15 @@ void addWord(std::string& line, std::string_view before, const std::string& word
   line += quoted(word);
 }
 
-void addSettings(std::string& line, std::string_view half, const std::vector<BoundParameter>& parameters) {
-  for (const BoundParameter& one : parameters) {
+void addSettings(std::string& line, std::string_view half, const std::vector<ResolvedParameter>& parameters) {
+  for (const ResolvedParameter& one : parameters) {
     if (one.value) addWord(line, " --set ", formatMessage("%@.%@=%@", half, one.name, *one.value));
   }
 }
 
 // The command that runs them again, and nothing else.
-std::string commandOf(const RunBegan& run, const std::vector<std::string>& names, const BoundParameters& parameters) {
+std::string commandOf(const RunStarted& run, const std::vector<std::string>& names,
+                      const ResolvedParameters& parameters) {
   std::string line = run.ofExperiments ? "quazor experiment" : "quazor run";
   for (const std::string& name : names) addWord(line, " ", name);
   for (const std::string& plugin : run.plugins) addWord(line, " --plugin ", plugin);
@@ -67,15 +68,15 @@ std::string commandOf(const RunBegan& run, const std::vector<std::string>& names
   return line;
 }
 
-Json setParametersJson(const BoundParameters& parameters) {
+Json setParametersJson(const ResolvedParameters& parameters) {
   Json json = Json::object();
   if (!parameters.experiment.empty()) json["experiment"] = dictionaryJson(dictionaryOf(parameters.experiment));
   if (!parameters.analysis.empty()) json["analysis"] = dictionaryJson(dictionaryOf(parameters.analysis));
   return json;
 }
 
-Json startJson(const RunBegan& run, const std::string& name, std::string commandLine,
-               const BoundParameters& parameters = {}, Json metadata = Json::object()) {
+Json startJson(const RunStarted& run, const std::string& name, std::string commandLine,
+               const ResolvedParameters& parameters = {}, Json metadata = Json::object()) {
   Json dut = {{"dutInfoId", "phone"}};
   addText(dut, "name", run.phone);
   metadata["seed"] = run.seed;
@@ -156,7 +157,7 @@ Json diagnosisJson(const JudgedResult& judged, bool known) {
 // Writes the test run of one record.
 class RecordWriter {
  public:
-  RecordWriter(std::string& out, const RunBegan& run, const DiagnosticRecord& record)
+  RecordWriter(std::string& out, const RunStarted& run, const DiagnosticRecord& record)
       : run_(run), record_(record), stream_(out, record.log, record.begin) {}
 
   // Gives the date of the last line.
@@ -165,7 +166,7 @@ class RecordWriter {
     addText(metadata, "summary", record_.summary);
     addText(metadata, "experiment", record_.experimentName);
     addText(metadata, "analysis", record_.analysisName);
-    RunBegan ofRecord = run_;
+    RunStarted ofRecord = run_;
     ofRecord.seed = record_.seed;
     ofRecord.ofExperiments = record_.experimentOnly;
     std::string command = commandOf(ofRecord, {record_.name}, record_.parameters);
@@ -268,7 +269,7 @@ class RecordWriter {
     stream_.end("ERROR", "NOT_APPLICABLE", record_.end);
   }
 
-  const RunBegan& run_;
+  const RunStarted& run_;
   const DiagnosticRecord& record_;
   OcpStream stream_;
   Date stepEnd_{};
@@ -277,7 +278,7 @@ class RecordWriter {
 
 }  // namespace
 
-std::string ocpReport(const RunBegan& run, const std::vector<DiagnosticRecord>& records,
+std::string ocpReport(const RunStarted& run, const std::vector<DiagnosticRecord>& records,
                       const std::optional<std::string>& interrupted) {
   std::string report;
   Date end = run.date;

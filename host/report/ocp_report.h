@@ -12,7 +12,7 @@ namespace quazor {
 
 // One test run for each record, each with sequence numbers of its own, one after the other; then one for what was
 // interrupted without a record and for each that was never run. `interrupted` is that of RunEnded.
-std::string ocpReport(const RunBegan& run, const std::vector<DiagnosticRecord>& records,
+std::string ocpReport(const RunStarted& run, const std::vector<DiagnosticRecord>& records,
                       const std::optional<std::string>& interrupted);
 
 }  // namespace quazor

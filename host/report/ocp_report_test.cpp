@@ -23,8 +23,8 @@ using testing::IsEmpty;
 
 constexpr Date kStart{};
 
-RunBegan startedRun() {
-  RunBegan run;
+RunStarted startedRun() {
+  RunStarted run;
   run.program = "0.1.0";
   run.contract = 2;
   run.plugins = {"p.so"};
@@ -139,7 +139,7 @@ TEST(OcpReport, StartsWithWhatWasRun) {
 }
 
 TEST(OcpReport, LeavesOutWhatHasNoValue) {
-  RunBegan bare;
+  RunStarted bare;
   DiagnosticRecord record = fullRecord(Verdict::kPass);
   record.summary = record.experimentName = record.analysisName = "";
   record.parameters = {};
@@ -155,7 +155,7 @@ TEST(OcpReport, QuotesTheCommandForAShell) {
   record.name = "it's";
   record.parameters.experiment = {};
   record.parameters.analysis.push_back({"a b", QZNumberParameter("", true), Value(0.5), ""});
-  RunBegan bare;
+  RunStarted bare;
   bare.plugins = {""};
   EXPECT_EQ(artifactsOf(ocpReport(bare, {record}, std::nullopt))[1].content["commandLine"],
             R"(quazor run 'it'\''s' --plugin '' --seed 7 --profile none --set 'analysis.a b=0.5')");
@@ -372,7 +372,7 @@ TEST(OcpReport, HasATestRunForEachRecord) {
 }
 
 TEST(OcpReport, TellsWhatWasInterruptedAndWhatNeverRan) {
-  RunBegan three = startedRun();
+  RunStarted three = startedRun();
   three.names = {"Diagnostic", "Second", "Third"};
   const std::vector<Artifact> artifacts = artifactsOf(ocpReport(three, {fullRecord(Verdict::kPass)}, "Second"));
   const std::vector<Json> starts = allOf(artifacts, "testRunStart");
@@ -393,7 +393,7 @@ TEST(OcpReport, TellsWhatWasInterruptedAndWhatNeverRan) {
 }
 
 TEST(OcpReport, TellsAnInterruptBetweenTwo) {
-  RunBegan two = startedRun();
+  RunStarted two = startedRun();
   two.names = {"Diagnostic", "Second"};
   two.ofExperiments = true;
   const std::vector<Artifact> artifacts = artifactsOf(ocpReport(two, {}, ""));

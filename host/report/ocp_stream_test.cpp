@@ -77,8 +77,9 @@ TEST(OcpStream, NeverGoesBackInTime) {
 }
 
 TEST(OcpStream, TellsHowSevereALogLineIs) {
-  const std::vector<LogLine> log = {
-      {{}, LogLevel::kError, "e", kStreamBegin}, {{}, LogLevel::kDefault, "i", kStreamBegin}, {{}, LogLevel::kDebug, "d", kStreamBegin}};
+  const std::vector<LogLine> log = {{{}, LogLevel::kError, "e", kStreamBegin},
+                                    {{}, LogLevel::kDefault, "i", kStreamBegin},
+                                    {{}, LogLevel::kDebug, "d", kStreamBegin}};
   std::string out;
   OcpStream(out, log, kStreamBegin).end("COMPLETE", "PASS", kStreamBegin);
   for (const char* line :

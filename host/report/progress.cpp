@@ -21,9 +21,9 @@ std::string secondsText(double seconds) { return defaultText(std::round(seconds 
 
 }  // namespace
 
-ExpectedProgress expectedProgressOf(const BoundParameters& parameters) {
+ExpectedProgress expectedProgressOf(const ResolvedParameters& parameters) {
   const auto above0 = [&parameters](std::string_view wanted) -> const Value* {
-    for (const BoundParameter& one : parameters.experiment) {
+    for (const ResolvedParameter& one : parameters.experiment) {
       if (one.name == wanted && one.value && toDouble(&*one.value) > 0) return &*one.value;
     }
     return nullptr;

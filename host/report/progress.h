@@ -18,7 +18,7 @@ struct ExpectedProgress {
   std::optional<std::uint64_t> frames;  // the experiment's parameter "frameCount", if 1 or more
 };
 
-ExpectedProgress expectedProgressOf(const BoundParameters& parameters);
+ExpectedProgress expectedProgressOf(const ResolvedParameters& parameters);
 
 // "Running NAME: 1.2 s of 3 s, 36 of 90 frames", without what is not expected or not known.
 std::string progressText(const std::string& name, double elapsedSeconds, const ExpectedProgress& expected,

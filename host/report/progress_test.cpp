@@ -10,8 +10,8 @@
 namespace quazor {
 namespace {
 
-BoundParameters withParameters(const std::vector<std::pair<std::string, std::optional<Value>>>& values) {
-  BoundParameters parameters;
+ResolvedParameters withParameters(const std::vector<std::pair<std::string, std::optional<Value>>>& values) {
+  ResolvedParameters parameters;
   for (const auto& [name, value] : values) {
     parameters.experiment.push_back({name, QZNumberParameter("", true), value, ""});
   }

@@ -36,8 +36,8 @@ Facts factsOf(const DiagnosticRecord& record) {
   Facts facts;
   facts.set("verdict", std::string(nameOf(record.verdict)));
   facts.set("error", oneLine(record.error));
-  for (const Half half : {Half::kExperiment, Half::kAnalysis}) {
-    for (const BoundParameter& one : record.parameters.of(half)) {
+  for (const Part half : {Part::kExperiment, Part::kAnalysis}) {
+    for (const ResolvedParameter& one : record.parameters.of(half)) {
       setFact(facts, formatMessage("parameter %@.%@", nameOf(half), one.name),
               one.value ? defaultText(*one.value) : "not set");
     }

@@ -17,7 +17,7 @@ namespace quazor {
 
 namespace {
 
-std::string textReport(const RunBegan& run, const std::vector<DiagnosticRecord>& records,
+std::string textReport(const RunStarted& run, const std::vector<DiagnosticRecord>& records,
                        const std::optional<std::string>& interrupted) {
   std::ostringstream text;
   for (const DiagnosticRecord& record : records) printReport(text, record, false, false);
@@ -56,11 +56,11 @@ OutputRequest parseOutput(const std::string& text, Format usual) {
   if (const std::optional<Format> format = formatNamed(word)) return {*format, text.substr(colon + 1)};
   std::vector<std::string> names;
   for (const Format format : kFormats) names.emplace_back(nameOf(format));
-  throw Refusal(ExitCode::kUsage, "--output '" + text + "': there is no format '" + word +
-                                      "' (a file of this name is './" + text + "')" + didYouMean(word, names));
+  throw CommandError(ExitCode::kUsage, "--output '" + text + "': there is no format '" + word +
+                                           "' (a file of this name is './" + text + "')" + didYouMean(word, names));
 }
 
-std::string reportText(Format format, const RunBegan& run, const std::vector<DiagnosticRecord>& records,
+std::string reportText(Format format, const RunStarted& run, const std::vector<DiagnosticRecord>& records,
                        const std::optional<std::string>& interrupted) {
   switch (format) {
     case Format::kText: return textReport(run, records, interrupted);

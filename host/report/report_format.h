@@ -26,11 +26,12 @@ struct OutputRequest {
   std::filesystem::path file;
 };
 
-// [FORMAT:]FILE; without a format it is `usual`. Throws a Refusal (kUsage) for a word before a colon that is no format.
+// [FORMAT:]FILE; without a format it is `usual`. Throws a CommandError (kUsage) for a word before a colon that is no
+// format.
 OutputRequest parseOutput(const std::string& text, Format usual);
 
 // The whole report of a run. `interrupted` is that of RunEnded.
-std::string reportText(Format format, const RunBegan& run, const std::vector<DiagnosticRecord>& records,
+std::string reportText(Format format, const RunStarted& run, const std::vector<DiagnosticRecord>& records,
                        const std::optional<std::string>& interrupted);
 
 // One record in the form for people.

@@ -32,7 +32,7 @@ TEST(ParseOutput, RefusesAWordBeforeAColonThatIsNoFormat) {
   try {
     parseOutput("jnuit:report", Format::kText);
     FAIL() << "it was taken";
-  } catch (const Refusal& refusal) {
+  } catch (const CommandError& refusal) {
     EXPECT_EQ(refusal.code(), ExitCode::kUsage);
     EXPECT_STREQ(refusal.what(),
                  "--output 'jnuit:report': there is no format 'jnuit' (a file of this name is "
@@ -70,7 +70,7 @@ class ReportTextTest : public testing::Test {
     return reportText(format, run_, records_, interrupted);
   }
 
-  RunBegan run_ = runOf({"A", "B"});
+  RunStarted run_ = runOf({"A", "B"});
   std::vector<DiagnosticRecord> records_ = {recordOf("A", Verdict::kPass), recordOf("B", Verdict::kFail)};
 };
 

@@ -14,9 +14,9 @@ RunReport::RunReport(ReportOptions options, Console& console)
 
 void RunReport::take(const RunEvent& event) {
   builder_.take(event);
-  if (const auto* const began = std::get_if<RunBegan>(&event)) {
+  if (const auto* const began = std::get_if<RunStarted>(&event)) {
     run_ = *began;
-  } else if (const auto* const diagnostic = std::get_if<DiagnosticBegan>(&event)) {
+  } else if (const auto* const diagnostic = std::get_if<DiagnosticStarted>(&event)) {
     progress_.start(diagnostic->name, expectedProgressOf(diagnostic->parameters));
   } else if (const auto* const logged = std::get_if<Logged>(&event)) {
     const LogLine& line = logged->line;

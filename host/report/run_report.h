@@ -57,7 +57,7 @@ class RunReport final : public RunEventSink {
   Console& console_;
   Progress progress_;
   RecordBuilder builder_;
-  RunBegan run_;
+  RunStarted run_;
   std::vector<DiagnosticRecord> records_;
   bool allWritten_ = true;
 };

@@ -20,15 +20,15 @@ using Json = nlohmann::ordered_json;
 
 // The events of a diagnostic whose record is this one.
 std::vector<RunEvent> eventsOf(const DiagnosticRecord& record) {
-  DiagnosticBegan began = beginningOf(record.name);
+  DiagnosticStarted began = beginningOf(record.name);
   began.experimentOnly = record.experimentOnly;
   began.parameters = record.parameters;
-  Found found;
+  ResultsReported found;
   for (const JudgedResult& one : record.measuredResults) found.results.push_back(one.result);
-  Measured measured;
+  MeasurementsAdded measured;
   for (const auto& one : record.measurements) measured.measurements.push_back(one);
   std::vector<RunEvent> events = {began, measured, found};
-  for (const auto& [key, value] : record.auxiliaryData) events.emplace_back(Collected{key, value});
+  for (const auto& [key, value] : record.auxiliaryData) events.emplace_back(AuxiliaryDataAdded{key, value});
   for (const LogLine& line : record.log) events.emplace_back(Logged{line});
   if (record.error != nullptr) events.emplace_back(Failed{Stage::kRun, record.error});
   events.emplace_back(FaultsCounted{record.faults});
@@ -56,7 +56,7 @@ class RunReportTest : public testing::Test {
 
   // Runs diagnostics with these verdicts, named A, B and so on.
   void run(RunReport& report, const std::vector<Verdict>& verdicts) const {
-    RunBegan began = runOf({});
+    RunStarted began = runOf({});
     began.ofExperiments = ofExperiments_;
     report.take(began);
     std::string name = "A";

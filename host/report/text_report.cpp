@@ -66,7 +66,7 @@ void printResults(std::ostream& out, const std::vector<JudgedResult>& results, b
 }
 
 void printHalf(std::ostream& out, std::string_view title, const std::string& name, const QZDescription& description,
-               const std::vector<BoundParameter>& parameters) {
+               const std::vector<ResolvedParameter>& parameters) {
   out << "\n  " << title << ' ' << printable(name) << '\n' << indentedLines(description.summary(), "    ");
   if (parameters.empty()) {
     out << "    It takes no parameters.\n";
@@ -75,7 +75,7 @@ void printHalf(std::ostream& out, std::string_view title, const std::string& nam
   using Align = Table::Align;
   Table table({Align::kLeft, Align::kRight, Align::kLeft, Align::kLeft});
   table.addRow({"Parameter", "Value", "From", "Meaning"});
-  for (const BoundParameter& one : parameters) {
+  for (const ResolvedParameter& one : parameters) {
     const std::string unset = one.declaration.required() ? "not set, required" : "not set";
     table.addRow({printable(one.name), one.value ? defaultText(*one.value) : "-",
                   one.value ? printable(one.source) : unset, printable(one.declaration.summary())});
@@ -183,7 +183,7 @@ void printList(std::ostream& out, const std::vector<DescribedDiagnostic>& diagno
   ofExperiments.print(out, "  ");
 }
 
-void printDescriptions(std::ostream& out, const std::vector<BoundDiagnostic>& diagnostics) {
+void printDescriptions(std::ostream& out, const std::vector<ResolvedDiagnostic>& diagnostics) {
   std::string_view separator;
   for (const auto& [described, parameters] : diagnostics) {
     const auto& [diagnostic, description] = described;

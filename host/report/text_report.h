@@ -2,7 +2,7 @@
 #pragma once
 
 #include "host/model/diagnostic_record.h"
-#include "host/plugin/catalogue.h"
+#include "host/plugin/diagnostic_registry.h"
 #include "host/plugin/parameters.h"
 
 #include <ostream>
@@ -34,6 +34,6 @@ void printUnfiredFaults(std::ostream& out, const DiagnosticRecord& record);
 
 // The diagnostics, then the experiments on their own, whose descriptions must be known.
 void printList(std::ostream& out, const std::vector<DescribedDiagnostic>& diagnostics);
-void printDescriptions(std::ostream& out, const std::vector<BoundDiagnostic>& diagnostics);
+void printDescriptions(std::ostream& out, const std::vector<ResolvedDiagnostic>& diagnostics);
 
 }  // namespace quazor

@@ -162,10 +162,10 @@ TEST(PrintList, HasExperimentsApart) {
 }
 
 TEST(PrintDescriptions, ShowsAnExperimentOnItsOwn) {
-  BoundDiagnostic bound;
+  ResolvedDiagnostic bound;
   bound.described = experimentAlone("X");
   bound.parameters.experiment.push_back({"x", QZNumberParameter("About x.", true), Value(2.5), "profile p.json"});
-  BoundDiagnostic used;
+  ResolvedDiagnostic used;
   used.described = experimentAlone("Y");
   used.described.diagnostic.usedBy = {"D.One", "D.Two"};
   std::ostringstream out;
@@ -188,7 +188,7 @@ TEST(PrintDescriptions, ShowsAnExperimentOnItsOwn) {
 }
 
 TEST(PrintDescriptions, ShowsValuesAndWhereTheyComeFrom) {
-  BoundDiagnostic bound;
+  ResolvedDiagnostic bound;
   bound.described.diagnostic = {"D", "S.", "E", "A", nullptr, nullptr};
   bound.described.description = {QZDescription("About E."), QZDescription("About A.\nMore."), nullptr};
   bound.parameters.experiment.push_back({"x", QZNumberParameter("About x.", true), Value(2.5), "profile p.json"});
@@ -214,7 +214,7 @@ TEST(PrintDescriptions, ShowsValuesAndWhereTheyComeFrom) {
 }
 
 TEST(PrintDescriptions, TellsWhyADiagnosticCannotBeDescribed) {
-  BoundDiagnostic bound;
+  ResolvedDiagnostic bound;
   bound.described.diagnostic = {"D", "S.", "E", "A", nullptr, nullptr};
   bound.described.description.error = hostError(HostErrorCode::kException, "it threw");
   std::ostringstream out;

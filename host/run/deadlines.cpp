@@ -12,9 +12,9 @@ namespace quazor {
 
 namespace {
 
-constexpr std::chrono::minutes kUsual{1};
+constexpr std::chrono::minutes kDefault{1};
 // What a clock's moments can be added to without an overflow.
-constexpr std::chrono::hours kLongest{24 * 365};
+constexpr std::chrono::hours kMaxLength{24 * 365};
 
 }  // namespace
 
@@ -26,25 +26,25 @@ DeadlineSetting parseDeadline(const std::string& text) {
     const std::string name = text.substr(0, equals);
     setting.stage = stageNamed(name);
     if (!setting.stage) {
-      throw Refusal(ExitCode::kUsage, what + "there is no stage '" + name +
-                                          "'; the stages are load, describe, setup, run, teardown and analyse");
+      throw CommandError(ExitCode::kUsage, what + "there is no stage '" + name +
+                                               "'; the stages are load, describe, setup, run, teardown and analyse");
     }
     seconds = text.substr(equals + 1);
   }
   std::string problem;
   const std::optional<Value> number = parseNumber(seconds, &problem);
-  if (!number) throw Refusal(ExitCode::kUsage, what + problem);
-  setting.time = std::min<std::chrono::nanoseconds>(nanosecondsFromSeconds(toDouble(&*number)), kLongest);
-  if (setting.time.count() <= 0) throw Refusal(ExitCode::kUsage, what + "the time must be above zero seconds");
+  if (!number) throw CommandError(ExitCode::kUsage, what + problem);
+  setting.time = std::min<std::chrono::nanoseconds>(nanosecondsFromSeconds(toDouble(&*number)), kMaxLength);
+  if (setting.time.count() <= 0) throw CommandError(ExitCode::kUsage, what + "the time must be above zero seconds");
   return setting;
 }
 
-Deadlines::Deadlines(const BoundParameters& parameters, const std::vector<DeadlineSetting>& settings) {
-  times_.fill(kUsual);
+Deadlines::Deadlines(const ResolvedParameters& parameters, const std::vector<DeadlineSetting>& settings) {
+  times_.fill(kDefault);
   if (const std::optional<double> seconds = expectedProgressOf(parameters).seconds) {
-    const double longest = std::chrono::duration<double>(kLongest).count();
+    const double longest = std::chrono::duration<double>(kMaxLength).count();
     times_[static_cast<std::size_t>(Stage::kRun)] =
-        kUsual + nanosecondsFromSeconds(std::isfinite(*seconds) ? std::min(2 * *seconds, longest) : longest);
+        kDefault + nanosecondsFromSeconds(std::isfinite(*seconds) ? std::min(2 * *seconds, longest) : longest);
   }
   // What is said of one stage counts more than what is said of all.
   for (const DeadlineSetting& one : settings) {

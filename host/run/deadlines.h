@@ -17,14 +17,14 @@ struct DeadlineSetting {
   std::chrono::nanoseconds time{};
 };
 
-// Throws a Refusal (kUsage) for a text that is not of that form, or whose time is not above zero.
+// Throws a CommandError (kUsage) for a text that is not of that form, or whose time is not above zero.
 DeadlineSetting parseDeadline(const std::string& text);
 
 class Deadlines {
  public:
   // Those of a diagnostic with these parameters: where nothing is set, a run may take a minute more than twice the
   // seconds that its parameters tell (its "duration", else its "timeout"), every other stage a minute.
-  Deadlines(const BoundParameters& parameters, const std::vector<DeadlineSetting>& settings);
+  Deadlines(const ResolvedParameters& parameters, const std::vector<DeadlineSetting>& settings);
 
   std::chrono::nanoseconds of(Stage stage) const { return times_[static_cast<std::size_t>(stage)]; }
 

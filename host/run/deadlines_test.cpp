@@ -15,8 +15,8 @@ using testing::HasSubstr;
 
 constexpr auto kYear = 365 * 24h;
 
-BoundParameters withParameters(const std::vector<std::pair<std::string, Value>>& values) {
-  BoundParameters parameters;
+ResolvedParameters withParameters(const std::vector<std::pair<std::string, Value>>& values) {
+  ResolvedParameters parameters;
   for (const auto& [name, value] : values) {
     parameters.experiment.push_back({name, QZNumberParameter("", true), value, ""});
   }
@@ -68,7 +68,7 @@ TEST(ParseDeadline, RefusesOtherTexts) {
     try {
       parseDeadline(row.text);
       ADD_FAILURE() << row.text << " was accepted";
-    } catch (const Refusal& refusal) {
+    } catch (const CommandError& refusal) {
       EXPECT_EQ(refusal.code(), ExitCode::kUsage) << row.text;
       EXPECT_THAT(refusal.what(), testing::StartsWith("--deadline '" + std::string(row.text) + "': ")) << row.text;
       EXPECT_THAT(refusal.what(), HasSubstr(row.problem)) << row.text;
@@ -93,7 +93,7 @@ TEST(Deadlines, GiveARunAMinuteMoreThanTwiceTheTimeItIsToldToTake) {
 }
 
 TEST(Deadlines, TakeWhatIsSetOfOneStageForMoreThanWhatIsSetOfAll) {
-  const BoundParameters parameters = withParameters({{"duration", 3}});
+  const ResolvedParameters parameters = withParameters({{"duration", 3}});
   const Deadlines all(parameters, {parseDeadline("5")});
   for (const Stage stage : kStages) EXPECT_EQ(all.of(stage), 5s) << nameOf(stage);
   for (const auto& settings : {std::vector{parseDeadline("run=7"), parseDeadline("5")},

@@ -2,7 +2,7 @@
 
 #include "host/error/host_error.h"
 #include "host/model/run_log.h"
-#include "host/plugin/idle_platform.h"
+#include "host/plugin/null_platform.h"
 #include "host/text/timestamp.h"
 
 #include <algorithm>
@@ -59,7 +59,7 @@ class LogOfRun {
 // One run's state between its stages.
 class Run {
  public:
-  Run(const Diagnostic& diagnostic, const BoundParameters& parameters, const Clock& clock, RunEventSink& events)
+  Run(const Diagnostic& diagnostic, const ResolvedParameters& parameters, const Clock& clock, RunEventSink& events)
       : diagnostic_(diagnostic), parameters_(parameters), clock_(clock), events_(events) {}
 
   // The experiment's result, or null.
@@ -96,14 +96,14 @@ class Run {
   }
 
   void tell(const QZExperimentResult& result) {
-    Measured chunk;
+    MeasurementsAdded chunk;
     for (const auto& one : result.measurements()) {
       chunk.measurements.push_back(one);
       if (chunk.measurements.size() < kChunk) continue;
-      events_.take(std::exchange(chunk, Measured()));
+      events_.take(std::exchange(chunk, MeasurementsAdded()));
     }
     if (!chunk.measurements.empty()) events_.take(chunk);
-    for (const auto& [key, value] : result.auxiliaryData()) events_.take(Collected{key, value});
+    for (const auto& [key, value] : result.auxiliaryData()) events_.take(AuxiliaryDataAdded{key, value});
   }
 
   void analyse(const QZExperimentResult& measured) {
@@ -113,7 +113,7 @@ class Run {
     const std::vector<QZMeasuredResult>& results = result->measuredResults();
     for (std::size_t i = 0; i < results.size(); i += kChunk) {
       const auto begin = results.begin() + static_cast<std::ptrdiff_t>(i);
-      events_.take(Found{{begin, begin + static_cast<std::ptrdiff_t>(std::min(kChunk, results.size() - i))}});
+      events_.take(ResultsReported{{begin, begin + static_cast<std::ptrdiff_t>(std::min(kChunk, results.size() - i))}});
     }
   }
 
@@ -121,7 +121,7 @@ class Run {
   template <class Work>
   void inStage(Stage stage, Work&& work) {
     stage_ = stage;
-    events_.take(StageBegan{stage, dateNow()});
+    events_.take(StageStarted{stage, dateNow()});
     const std::chrono::nanoseconds begin = clock_.now();
     std::forward<Work>(work)();
     const std::chrono::nanoseconds duration = clock_.now() - begin;
@@ -179,7 +179,7 @@ class Run {
   }
 
   const Diagnostic& diagnostic_;
-  const BoundParameters& parameters_;
+  const ResolvedParameters& parameters_;
   const Clock& clock_;
   RunEventSink& events_;
   Stage stage_ = Stage::kDescribe;
@@ -188,7 +188,7 @@ class Run {
 
 }  // namespace
 
-void runDiagnostic(const Diagnostic& diagnostic, const BoundParameters& parameters, const RunOptions& options,
+void runDiagnostic(const Diagnostic& diagnostic, const ResolvedParameters& parameters, const RunOptions& options,
                    RunEventSink& events) {
   OneAtATime serial(events);
   const std::shared_ptr<const Phone> phone = options.makePhone();
@@ -200,16 +200,16 @@ void runDiagnostic(const Diagnostic& diagnostic, const BoundParameters& paramete
     Run run(diagnostic, parameters, *platform.clock, serial);
     const std::unique_ptr<QZExperimentResult> result = run.experiment();
     if (result != nullptr && !diagnostic.experimentOnly) run.analyse(*result);
-    installPlatform(idlePlatform());
+    installPlatform(nullPlatform());
   }
   events.take(FaultsCounted{phone->faults()});
   events.take(DiagnosticCompleted{});
 }
 
-void analyseResult(const Diagnostic& diagnostic, const BoundParameters& parameters, const QZExperimentResult& result,
+void analyseResult(const Diagnostic& diagnostic, const ResolvedParameters& parameters, const QZExperimentResult& result,
                    LogLevel logLevel, RunEventSink& events) {
   OneAtATime serial(events);
-  const Platform platform = idlePlatform();
+  const Platform platform = nullPlatform();
   {
     const LogOfRun log(platform.clock, logLevel, serial);
     installPlatform(platform);

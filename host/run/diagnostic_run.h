@@ -4,7 +4,7 @@
 #include "contract/results.h"
 #include "host/device/phone.h"
 #include "host/model/run_event.h"
-#include "host/plugin/catalogue.h"
+#include "host/plugin/diagnostic_registry.h"
 #include "host/plugin/parameters.h"
 
 #include <functional>
@@ -26,12 +26,12 @@ struct RunOptions {
 // A stage that fails, gives nothing or throws ends the run, but for a teardown: that one follows on every setup that
 // succeeded, and after one that failed the analysis still takes place, for what it shows. An experiment on its own ends
 // with its teardown.
-void runDiagnostic(const Diagnostic& diagnostic, const BoundParameters& parameters, const RunOptions& options,
+void runDiagnostic(const Diagnostic& diagnostic, const ResolvedParameters& parameters, const RunOptions& options,
                    RunEventSink& events);
 
 // As runDiagnostic, from the analysis on: `result` is what an earlier run measured, and is told first. There is no
 // phone.
-void analyseResult(const Diagnostic& diagnostic, const BoundParameters& parameters, const QZExperimentResult& result,
+void analyseResult(const Diagnostic& diagnostic, const ResolvedParameters& parameters, const QZExperimentResult& result,
                    LogLevel logLevel, RunEventSink& events);
 
 }  // namespace quazor

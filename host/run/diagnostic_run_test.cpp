@@ -39,20 +39,20 @@ class DiagnosticRunTest : public testing::Test {
   }
 
   DiagnosticRecord run(const std::vector<std::string>& texts = {"duration=2", "measured=90", "minimum=90"}) {
-    const BoundParameters parameters = boundTo(texts);
+    const ResolvedParameters parameters = boundTo(texts);
     events_.events.clear();
-    DiagnosticBegan began = beginningOf("Fake");
+    DiagnosticStarted began = beginningOf("Fake");
     began.experimentOnly = diagnostic_.diagnostic.experimentOnly;
     events_.take(began);
     runDiagnostic(diagnostic_.diagnostic, parameters, options_, events_);
     return recordOfEvents();
   }
 
-  BoundParameters boundTo(const std::vector<std::string>& texts) {
+  ResolvedParameters boundTo(const std::vector<std::string>& texts) {
     diagnostic_.description = describeDiagnostic(diagnostic_.diagnostic);
-    std::vector<Setting> settings;
-    for (const std::string& text : texts) settings.push_back(parseSetting(text));
-    return bindParameters(diagnostic_, {}, settings);
+    std::vector<ParameterOverride> settings;
+    for (const std::string& text : texts) settings.push_back(parseOverride(text));
+    return resolveParameters(diagnostic_, {}, settings);
   }
 
   // What the events come to when the host closes them.
@@ -97,7 +97,7 @@ TEST_F(DiagnosticRunTest, TellsEachStageWithItsBeginningAndEnd) {
   std::vector<Stage> stages;
   std::optional<Stage> open;
   for (const RunEvent& event : events_.events) {
-    if (const auto* const began = std::get_if<StageBegan>(&event)) {
+    if (const auto* const began = std::get_if<StageStarted>(&event)) {
       EXPECT_EQ(open, std::nullopt);
       open = began->stage;
       stages.push_back(began->stage);
@@ -417,8 +417,8 @@ TEST_F(LargeDiagnosticTest, TellsManyMeasurementsAndResultsInSeveralEvents) {
   };
   for (const auto& [measurements, events] : {Row{0, 0}, Row{1, 1}, Row{500, 1}, Row{501, 2}, Row{1201, 3}}) {
     const DiagnosticRecord record = runLarge(measurements);
-    EXPECT_EQ(count<Measured>(), events) << measurements;
-    EXPECT_EQ(count<Found>(), events) << measurements;
+    EXPECT_EQ(count<MeasurementsAdded>(), events) << measurements;
+    EXPECT_EQ(count<ResultsReported>(), events) << measurements;
     ASSERT_EQ(record.measurements.size(), static_cast<std::size_t>(measurements));
     ASSERT_EQ(record.measuredResults.size(), static_cast<std::size_t>(measurements));
     int i = 0;
@@ -436,7 +436,7 @@ class AnalyseResultTest : public DiagnosticRunTest {
     QZExperimentResult result;
     result.measurements().set("Count", Measurement(90, QZDimensionlessUnit::frames()));
     result.auxiliaryData().set("bytes", Bytes{1});
-    const BoundParameters parameters = boundTo(texts);
+    const ResolvedParameters parameters = boundTo(texts);
     events_.events = {beginningOf("Fake")};
     analyseResult(diagnostic_.diagnostic, parameters, result, level, events_);
     return recordOfEvents();

@@ -34,8 +34,8 @@ using namespace std::chrono_literals;
 // The exit code of a child that found its connection gone.
 constexpr int kNoConnection = 113;
 // Of what a plug-in writes to its standard output, so many lines are kept, and so many octets.
-constexpr std::size_t kMostOutputLines = 10'000;
-constexpr std::size_t kMostOutput = 4'000'000;
+constexpr std::size_t kMaxOutputLines = 10'000;
+constexpr std::size_t kMaxOutput = 4'000'000;
 
 // The child's end of the connection: a line for each thing that it says.
 class Connection {
@@ -82,9 +82,9 @@ DiagnosticErrorPtr errorOf(const Supervised& supervised, const std::string& duri
     case SupervisionEnd::kInterrupted:
       return hostError(HostErrorCode::kInterrupted, during + " was interrupted" + stuck);
     case SupervisionEnd::kLineTooLong:
-      return hostError(HostErrorCode::kConnectionLost,
-                       during + " wrote more than " + std::to_string(kLongestEvent >> 20U) +
-                           " MiB in one line of its process' connection to quazor" + stuck);
+      return hostError(HostErrorCode::kConnectionLost, during + " wrote more than " + std::to_string(kMaxEvent >> 20U) +
+                                                           " MiB in one line of its process' connection to quazor" +
+                                                           stuck);
     case SupervisionEnd::kConnectionLost: break;
     case SupervisionEnd::kEnded: {
       const ProcessEnd& end = *supervised.end;
@@ -123,7 +123,7 @@ std::vector<std::filesystem::path> pluginsOf(const Diagnostic& one, const std::v
 // One attempt at a survey: what a process says until it ends.
 class SurveyAttempt {
  public:
-  SurveyAttempt(const IsolationOptions& options, const std::vector<std::filesystem::path>& plugins, Survey& survey,
+  SurveyAttempt(const IsolationOptions& options, const std::vector<std::filesystem::path>& plugins, PluginScan& survey,
                 const DiagnosticChoice& described)
       : deadlines_({}, options.deadlines),
         memory_(options.memory),
@@ -146,7 +146,7 @@ class SurveyAttempt {
       supervision.isDone = [this] { return done_; };
       end = supervise(child, signals, supervision);
     }
-    if (refusal_) throw Refusal(*refusal_);
+    if (refusal_) throw CommandError(*refusal_);
     if (done_) return true;
     if (end.how == SupervisionEnd::kInterrupted) survey_.interrupted = true;
     blame(end);
@@ -175,7 +175,7 @@ class SurveyAttempt {
             {{"says", "described"}, {"description", descriptionJson(describeIfWanted(catalogue[i], wanted))}});
       }
       connection.say({{"says", "done"}});
-    } catch (const Refusal& refusal) {
+    } catch (const CommandError& refusal) {
       connection.say(
           {{"says", "refused"}, {"code", static_cast<int>(refusal.code())}, {"text", losslessText(refusal.what())}});
     }
@@ -196,7 +196,8 @@ class SurveyAttempt {
       } else if (what == "described") {
         describe(descriptionFrom(memberOf(said, "description")));
       } else if (what == "refused") {
-        refusal_ = Refusal(static_cast<ExitCode>(memberOf(said, "code").get<int>()), textFrom(memberOf(said, "text")));
+        refusal_ =
+            CommandError(static_cast<ExitCode>(memberOf(said, "code").get<int>()), textFrom(memberOf(said, "text")));
         done_ = true;
       } else {
         done_ = what == "done";
@@ -236,13 +237,13 @@ class SurveyAttempt {
   const Deadlines deadlines_;
   const std::optional<std::uint64_t> memory_;
   const std::vector<std::filesystem::path>& plugins_;
-  Survey& survey_;
+  PluginScan& survey_;
   const DiagnosticChoice& described_;
   const std::size_t known_;
   std::vector<Diagnostic> catalogue_;
   std::optional<std::string> loading_;
   std::optional<std::filesystem::path> failedPlugin_;
-  std::optional<Refusal> refusal_;
+  std::optional<CommandError> refusal_;
   Stage stage_ = Stage::kLoad;
   Moment deadline_;
   bool done_ = false;
@@ -282,7 +283,7 @@ class IsolatedRun {
     } catch (const BadRecord&) {
     }
     if (!event || completed_ || isOfHost(*event)) return false;
-    if (const auto* const began = std::get_if<StageBegan>(&*event)) beginStage(began->stage);
+    if (const auto* const began = std::get_if<StageStarted>(&*event)) beginStage(began->stage);
     if (const auto* const logged = std::get_if<Logged>(&*event)) time_ = logged->line.time;
     // What comes between two stages may be much, but it comes; log lines may come for ever.
     if (std::holds_alternative<StageEnded>(*event)) between_ = true;
@@ -294,13 +295,13 @@ class IsolatedRun {
 
   static bool isOfHost(const RunEvent& event) {
     const auto* const failed = std::get_if<Failed>(&event);
-    return std::holds_alternative<RunBegan>(event) || std::holds_alternative<DiagnosticBegan>(event) ||
+    return std::holds_alternative<RunStarted>(event) || std::holds_alternative<DiagnosticStarted>(event) ||
            std::holds_alternative<DiagnosticEnded>(event) || std::holds_alternative<RunEnded>(event) ||
            (failed != nullptr && !failed->stage);
   }
 
   void takeOutput(std::string_view line) {
-    const bool isTooMuch = outputLines_ == kMostOutputLines || line.size() > kMostOutput - output_;
+    const bool isTooMuch = outputLines_ == kMaxOutputLines || line.size() > kMaxOutput - output_;
     if (isTooMuch || droppedLines_ > 0) {
       ++droppedLines_;
       return;
@@ -346,14 +347,14 @@ std::vector<std::filesystem::path> pluginsFor(const Diagnostic& diagnostic,
 std::optional<Diagnostic> loadDiagnostic(const IsolationOptions& options, const Diagnostic& wanted,
                                          RunEventSink& events) {
   std::optional<Diagnostic> found;
-  events.take(StageBegan{Stage::kLoad, dateNow()});
+  events.take(StageStarted{Stage::kLoad, dateNow()});
   std::string problem = "the plug-ins no longer register " + wanted.name;
   try {
     loadSomePlugins(pluginsFor(wanted, options.plugins));
     for (const Diagnostic& one : catalogueOf(QZLab::defaultLab())) {
       if (one.name == wanted.name && one.experimentOnly == wanted.experimentOnly) found = one;
     }
-  } catch (const Refusal& refusal) {
+  } catch (const CommandError& refusal) {
     problem = refusal.what();
   }
   if (!found) events.take(Failed{Stage::kLoad, hostError(HostErrorCode::kNothingMade, problem)});
@@ -378,8 +379,8 @@ IsolationOptions withoutFailed(IsolationOptions options, const std::vector<Faile
   return options;
 }
 
-Survey surveyPlugins(const IsolationOptions& options, WatchedSignals& signals, const DiagnosticChoice& described) {
-  Survey survey;
+PluginScan scanPlugins(const IsolationOptions& options, WatchedSignals& signals, const DiagnosticChoice& described) {
+  PluginScan survey;
   std::vector<std::filesystem::path> plugins = options.plugins;
   while (!plugins.empty()) {
     SurveyAttempt attempt(options, plugins, survey, described);
@@ -393,7 +394,7 @@ Survey surveyPlugins(const IsolationOptions& options, WatchedSignals& signals, c
 }
 
 bool runIsolated(const IsolationOptions& options, WatchedSignals& signals, const Diagnostic& diagnostic,
-                 const BoundParameters& parameters, const RunOptions& runOptions, const QZExperimentResult* result,
+                 const ResolvedParameters& parameters, const RunOptions& runOptions, const QZExperimentResult* result,
                  Progress& progress, RunEventSink& events) {
   const Deadlines deadlines(parameters, options.deadlines);
   SharedCounter frames;

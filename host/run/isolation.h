@@ -2,7 +2,7 @@
 #pragma once
 
 #include "host/model/run_event.h"
-#include "host/plugin/catalogue.h"
+#include "host/plugin/diagnostic_registry.h"
 #include "host/plugin/parameters.h"
 #include "host/report/progress.h"
 #include "host/run/deadlines.h"
@@ -35,7 +35,7 @@ struct FailedPlugin {
 IsolationOptions withoutFailed(IsolationOptions options, const std::vector<FailedPlugin>& failed);
 
 // What the plug-ins have, without their factories, and those of them that could not be loaded.
-struct Survey {
+struct PluginScan {
   std::vector<DescribedDiagnostic> catalogue;
   std::vector<FailedPlugin> failed;
   bool interrupted = false;
@@ -48,7 +48,7 @@ using DiagnosticChoice = std::function<std::vector<Diagnostic>(const std::vector
 // description. A plug-in that ends its process while it is loaded is left out and told in `failed`; what
 // ends its process while it is described has that as its description's error. Throws the Refusals of loadPlugins and of
 // `described`, which is called in that process.
-Survey surveyPlugins(const IsolationOptions& options, WatchedSignals& signals, const DiagnosticChoice& described);
+PluginScan scanPlugins(const IsolationOptions& options, WatchedSignals& signals, const DiagnosticChoice& described);
 
 // As runDiagnostic, in a process of its own, which loads the plug-ins that the diagnostic needs, and no others where
 // they are known. Whatever ends that process before its time becomes a Failed event of the stage it was in, and there
@@ -57,7 +57,7 @@ Survey surveyPlugins(const IsolationOptions& options, WatchedSignals& signals, c
 //
 // `result`, if it is not null, is analysed, and no experiment is run.
 bool runIsolated(const IsolationOptions& options, WatchedSignals& signals, const Diagnostic& diagnostic,
-                 const BoundParameters& parameters, const RunOptions& runOptions, const QZExperimentResult* result,
+                 const ResolvedParameters& parameters, const RunOptions& runOptions, const QZExperimentResult* result,
                  Progress& progress, RunEventSink& events);
 
 }  // namespace quazor

@@ -34,12 +34,12 @@ std::vector<Diagnostic> everything(const std::vector<Diagnostic>& catalogue) { r
 
 class IsolationTest : public testing::Test {
  protected:
-  Survey survey(const std::vector<std::string>& plugins) {
+  PluginScan survey(const std::vector<std::string>& plugins) {
     for (const std::string& name : plugins) options_.plugins.push_back(plugin(name));
-    return surveyPlugins(options_, signals_, everything);
+    return scanPlugins(options_, signals_, everything);
   }
 
-  static std::vector<std::string> namesIn(const Survey& survey) {
+  static std::vector<std::string> namesIn(const PluginScan& survey) {
     std::vector<std::string> names;
     for (const DescribedDiagnostic& one : survey.catalogue) names.push_back(one.diagnostic.name);
     return names;
@@ -54,7 +54,7 @@ using SurveyTest = IsolationTest;
 
 TEST_F(SurveyTest, TellsWhatThePluginsHaveWithoutLoadingThemHere) {
   const std::size_t before = QZLab::defaultLab().registrations().size();
-  const Survey all = survey({"working", "experiments"});
+  const PluginScan all = survey({"working", "experiments"});
   EXPECT_EQ(QZLab::defaultLab().registrations().size(), before);
   EXPECT_THAT(all.failed, IsEmpty());
   EXPECT_FALSE(all.interrupted);
@@ -75,7 +75,7 @@ TEST_F(SurveyTest, TellsWhatThePluginsHaveWithoutLoadingThemHere) {
 
 TEST_F(SurveyTest, AsksOnlyForTheDescriptionsThatAreWanted) {
   options_.plugins = {plugin("working")};
-  const Survey some = surveyPlugins(options_, signals_, [](const std::vector<Diagnostic>& catalogue) {
+  const PluginScan some = scanPlugins(options_, signals_, [](const std::vector<Diagnostic>& catalogue) {
     return std::vector<Diagnostic>{catalogue[1]};
   });
   EXPECT_EQ(some.catalogue.size(), 9U);
@@ -88,13 +88,13 @@ TEST_F(SurveyTest, AsksOnlyForTheDescriptionsThatAreWanted) {
 TEST_F(SurveyTest, ThrowsTheRefusalsOfTheChoice) {
   options_.plugins = {plugin("working")};
   const auto refuse = [](const std::vector<Diagnostic>&) -> std::vector<Diagnostic> {
-    throw Refusal(ExitCode::kUsage, "not that");
+    throw CommandError(ExitCode::kUsage, "not that");
   };
-  EXPECT_THROW(surveyPlugins(options_, signals_, refuse), Refusal);
+  EXPECT_THROW(scanPlugins(options_, signals_, refuse), CommandError);
 }
 
 TEST_F(SurveyTest, TellsWhichPluginsADiagnosticNeeds) {
-  const Survey all = survey({"working", "combining", "experiments"});
+  const PluginScan all = survey({"working", "combining", "experiments"});
   const auto pluginsOf = [&all](const std::string& name) {
     for (const DescribedDiagnostic& one : all.catalogue) {
       if (one.diagnostic.name == name) return one.diagnostic.plugins;
@@ -112,14 +112,14 @@ TEST_F(SurveyTest, ThrowsTheRefusalsOfTheLoader) {
   try {
     survey({"working", "empty"});
     ADD_FAILURE() << "it was accepted";
-  } catch (const Refusal& refusal) {
+  } catch (const CommandError& refusal) {
     EXPECT_EQ(refusal.code(), ExitCode::kCannotRead);
     EXPECT_EQ(std::string(refusal.what()), "the plug-in '" + plugin("empty").string() + "' registers nothing");
   }
 }
 
 TEST_F(SurveyTest, LeavesOutAPluginThatEndsItsProcessWhileItIsLoaded) {
-  const Survey rest = survey({"experiments", "fatal", "analysis"});
+  const PluginScan rest = survey({"experiments", "fatal", "analysis"});
   EXPECT_THAT(namesIn(rest), ElementsAre("Alone.Images", "Alone.Counts", "Alone.Nothing"));
   ASSERT_EQ(rest.failed.size(), 1U);
   EXPECT_EQ(rest.failed[0].file, plugin("fatal"));
@@ -128,7 +128,7 @@ TEST_F(SurveyTest, LeavesOutAPluginThatEndsItsProcessWhileItIsLoaded) {
 }
 
 TEST_F(SurveyTest, IsEmptyWhenNoPluginCanBeLoaded) {
-  const Survey none = survey({"fatal"});
+  const PluginScan none = survey({"fatal"});
   EXPECT_THAT(none.catalogue, IsEmpty());
   EXPECT_EQ(none.failed.size(), 1U);
 }
@@ -136,7 +136,7 @@ TEST_F(SurveyTest, IsEmptyWhenNoPluginCanBeLoaded) {
 TEST_F(SurveyTest, EndsALoadingThatTakesTooLong) {
   options_.deadlines = {{Stage::kLoad, 50ms}};
   const EnvironmentVariable way("FATAL_PLUGIN", "hang");
-  const Survey none = survey({"fatal"});
+  const PluginScan none = survey({"fatal"});
   ASSERT_EQ(none.failed.size(), 1U);
   EXPECT_THAT(textOf(none.failed[0].error),
               testing::AllOf(testing::StartsWith("QuazorHostErrorDomain 8 loading the plug-in '"),
@@ -154,7 +154,7 @@ TEST_F(SurveyTest, LeavesOutAPluginThatWritesToItsProcessConnection) {
   options_.plugins = {plugin("fatal")};
   for (const char* line : kLines) {
     const EnvironmentVariable way("FATAL_PLUGIN", line);
-    const Survey none = surveyPlugins(options_, signals_, everything);
+    const PluginScan none = scanPlugins(options_, signals_, everything);
     ASSERT_EQ(none.failed.size(), 1U) << line;
     EXPECT_THAT(textOf(none.failed[0].error),
                 testing::EndsWith("closed or overwrote its process' connection to quazor"))
@@ -164,7 +164,7 @@ TEST_F(SurveyTest, LeavesOutAPluginThatWritesToItsProcessConnection) {
 }
 
 TEST_F(SurveyTest, GoesOnBehindWhatEndsItsProcessWhileItIsDescribed) {
-  const Survey all = survey({"undescribable", "unruly"});
+  const PluginScan all = survey({"undescribable", "unruly"});
   EXPECT_THAT(all.failed, IsEmpty());
   ASSERT_THAT(namesIn(all), ElementsAre("Fatal", "Unruly", "FatalExperiment", "UnrulyExperiment"));
   EXPECT_EQ(textOf(all.catalogue[0].description.error),
@@ -179,7 +179,7 @@ TEST_F(SurveyTest, GoesOnBehindWhatEndsItsProcessWhileItIsDescribed) {
 TEST_F(SurveyTest, EndsWhenTheUserInterruptsIt) {
   const EnvironmentVariable way("FATAL_PLUGIN", "hang");
   ASSERT_EQ(::kill(::getpid(), SIGINT), 0);
-  const Survey none = survey({"fatal", "working"});
+  const PluginScan none = survey({"fatal", "working"});
   EXPECT_TRUE(none.interrupted);
 }
 
@@ -193,16 +193,16 @@ class RunTest : public IsolationTest {
   DiagnosticRecord run(const std::string& pluginName, const std::string& name,
                        const std::vector<std::string>& texts = {}, const QZExperimentResult* result = nullptr) {
     options_.plugins = {plugin(pluginName)};
-    std::vector<Setting> settings;
-    for (const std::string& text : texts) settings.push_back(parseSetting(text));
+    std::vector<ParameterOverride> settings;
+    for (const std::string& text : texts) settings.push_back(parseOverride(text));
     DescribedDiagnostic diagnostic;
     diagnostic.diagnostic.name = name;
-    for (const Setting& one : settings) {
+    for (const ParameterOverride& one : settings) {
       const QZNumberParameter parameter("", false);
       diagnostic.description.experiment.addParameter(parameter, one.name);
       diagnostic.description.analysis.addParameter(parameter, one.name);
     }
-    const BoundParameters parameters = bindParameters(diagnostic, {}, settings);
+    const ResolvedParameters parameters = resolveParameters(diagnostic, {}, settings);
     events_.events.clear();
     RecordBuilder builder;
     builder.take(beginningOf(name));
@@ -242,7 +242,7 @@ TEST_F(RunTest, TellsWhatARunInThisProcessWouldTell) {
             "stageBegan stageEnded stageBegan stageEnded stageBegan stageEnded stageBegan log log stageEnded measured "
             "collected collected stageBegan log stageEnded stageBegan stageEnded found faultsCounted "
             "diagnosticCompleted");
-  EXPECT_EQ(std::get<StageBegan>(events_.events[0]).stage, Stage::kLoad);
+  EXPECT_EQ(std::get<StageStarted>(events_.events[0]).stage, Stage::kLoad);
   EXPECT_EQ(*record.measurements.find("Count"), Measurement(90, QZDimensionlessUnit::frames()));
   EXPECT_EQ(*record.auxiliaryData.find("list"), Value(Array{-1, 18446744073709551615U, 36.6F, 0.1, true, "text"}));
   EXPECT_EQ(record.durations.run, 2s);
@@ -268,7 +268,7 @@ TEST_F(RunTest, AnalysesAResult) {
 }
 
 TEST_F(RunTest, LoadsOnlyThePluginsThatTheDiagnosticNeeds) {
-  const Survey all = survey({"working", "combining"});
+  const PluginScan all = survey({"working", "combining"});
   const auto runNow = [&](const std::string& name, const std::vector<std::string>& plugins) {
     options_.plugins.clear();
     for (const std::string& one : plugins) options_.plugins.push_back(plugin(one));
@@ -276,7 +276,7 @@ TEST_F(RunTest, LoadsOnlyThePluginsThatTheDiagnosticNeeds) {
     builder.take(beginningOf(name));
     for (const DescribedDiagnostic& one : all.catalogue) {
       if (one.diagnostic.name != name) continue;
-      const BoundParameters parameters = bindParameters(one, {}, {parseSetting("experiment.duration=1")});
+      const ResolvedParameters parameters = resolveParameters(one, {}, {parseOverride("experiment.duration=1")});
       runIsolated(options_, signals_, one.diagnostic, parameters, runOptions_, nullptr, progress_, builder);
     }
     for (const RunEvent& event : builder.ending(momentAt(99))) builder.take(event);
@@ -399,7 +399,7 @@ TEST_F(RunTest, ShowsTheFramesOfThePhoneInTheOtherProcess) {
    public:
     Platform platform() const override {
       ::usleep(450'000);  // past the time for which nothing is shown
-      return idlePlatform();
+      return nullPlatform();
     }
     std::vector<DeclaredFault> faults() const override { return {}; }
     std::uint64_t framesDelivered() const override { return 17; }

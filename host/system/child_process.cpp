@@ -31,9 +31,9 @@ using SteadyClock = std::chrono::steady_clock;
 
 // Out of the way of descriptors that a plug-in opens, and of small numbers that it may close by mistake.
 constexpr int kConnection = 250;
-constexpr SteadyClock::duration kLongestWait = 5s;
+constexpr SteadyClock::duration kMaxWait = 5s;
 // How long a process that restores the hardware may take for it.
-constexpr SteadyClock::duration kLongestTidying = 1s;
+constexpr SteadyClock::duration kMaxTidying = 1s;
 
 [[noreturn]] void refuse(const char* what) { throw std::system_error(errno, std::generic_category(), what); }
 
@@ -191,12 +191,12 @@ ChildProcess::~ChildProcess() {
     for (const pid_t one : childrenOfThisProcess()) {
       if (std::find(others_.begin(), others_.end(), one) != others_.end()) continue;
       const bool isRestoring = isCleanupProcess_ != nullptr && isCleanupProcess_(nameOfProcess(one));
-      if (!isRestoring || SteadyClock::now() >= begin + kLongestTidying) ::kill(one, SIGKILL);
+      if (!isRestoring || SteadyClock::now() >= begin + kMaxTidying) ::kill(one, SIGKILL);
       if (::waitpid(one, nullptr, WNOHANG) == 0) left.push_back(one);
     }
     // What has been ended may have left further ones to this process, so only a look that finds nobody is the last.
     if (left.empty() && childrenOfThisProcess().size() <= others_.size()) return;
-    if (SteadyClock::now() >= begin + kLongestWait) return;
+    if (SteadyClock::now() >= begin + kMaxWait) return;
     std::this_thread::sleep_for(1ms);
   }
 }

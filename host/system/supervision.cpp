@@ -19,8 +19,8 @@ constexpr std::chrono::milliseconds kTick = 100ms;
 // How long a child may take to end by itself when it has nothing more to say, and after SIGTERM.
 constexpr std::chrono::milliseconds kGrace = 500ms;
 // How long a killed process is waited for: one that is stuck in the kernel does not end.
-constexpr std::chrono::seconds kLongestDeath = 5s;
-constexpr std::size_t kLongestOutput = 1U << 16;
+constexpr std::chrono::seconds kMaxDeath = 5s;
+constexpr std::size_t kMaxOutputLength = 1U << 16;
 
 // Cuts what is read from a descriptor into lines. One that is longer than `longest`, in octets, is cut too or, with
 // kRefuse, dropped: reading is over then.
@@ -42,7 +42,7 @@ class LineReader {
   template <class Take>
   bool read(Take&& take) {
     std::array<char, 65536> octets;
-    for (int i = 0; i < kMostReads; ++i) {
+    for (int i = 0; i < kMaxReads; ++i) {
       const ssize_t count = ::read(descriptor_, octets.data(), octets.size());
       if (count < 0) return true;  // nothing at the moment
       if (count == 0) {
@@ -60,7 +60,7 @@ class LineReader {
 
  private:
   // So many that reading is not interrupted for each, and so few that other descriptors have their turn.
-  static constexpr int kMostReads = 16;
+  static constexpr int kMaxReads = 16;
 
   template <class Take>
   bool cut(Take&& take) {
@@ -96,8 +96,8 @@ class Supervisor {
       : child_(child),
         signals_(signals),
         supervision_(supervision),
-        connection_(child.connectionDescriptor(), kLongestEvent, LineReader::LongLines::kRefuse),
-        output_(child.outputDescriptor(), kLongestOutput, LineReader::LongLines::kCut),
+        connection_(child.connectionDescriptor(), kMaxEvent, LineReader::LongLines::kRefuse),
+        output_(child.outputDescriptor(), kMaxOutputLength, LineReader::LongLines::kCut),
         requestsBefore_(signals.requestsToEnd()) {}
 
   Supervised run() {
@@ -171,7 +171,7 @@ class Supervisor {
     killed_ = true;
     endsByItself_ = false;
     child_.signalGroup(SIGKILL);
-    limit_ = now + kLongestDeath;
+    limit_ = now + kMaxDeath;
   }
 
   // What the child wrote before its end is still to be read: it is in the pipes, which hold less than is read at once.

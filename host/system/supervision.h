@@ -13,7 +13,7 @@
 namespace quazor {
 
 // The longest line of the connection, in octets; a few more may come.
-inline constexpr std::size_t kLongestEvent = std::size_t{64} << 20U;
+inline constexpr std::size_t kMaxEvent = std::size_t{64} << 20U;
 
 // What is to be done with what a child says. All are called on the watching thread.
 struct Supervision {
@@ -36,7 +36,7 @@ enum class SupervisionEnd {
   kDeadline,        // it was ended at the deadline
   kInterrupted,     // it was ended because this process was asked to end
   kConnectionLost,  // it was ended because it had closed the connection, or had written what is no line of it
-  kLineTooLong,     // it was ended because it had written a line of more than kLongestEvent octets to it
+  kLineTooLong,     // it was ended because it had written a line of more than kMaxEvent octets to it
 };
 
 struct Supervised {

@@ -27,12 +27,12 @@ std::vector<RunEvent> closed(std::vector<RunEvent> events) {
 
 }  // namespace
 
-RunBegan runOf(std::vector<std::string> names) {
+RunStarted runOf(std::vector<std::string> names) {
   return {"0.1.0", 2, momentAt(0), {"p.so"}, "phone.json", 5, false, std::move(names)};
 }
 
-DiagnosticBegan beginningOf(const std::string& name) {
-  DiagnosticBegan began{name, "Its summary.", "E", "A", false, {}, 5, momentAt(1)};
+DiagnosticStarted beginningOf(const std::string& name) {
+  DiagnosticStarted began{name, "Its summary.", "E", "A", false, {}, 5, momentAt(1)};
   began.parameters.experiment.push_back({"duration", QZNumberParameter("How long.", true), Value(3), "command line"});
   began.parameters.analysis.push_back({"gain", QZNumberParameter("How much.", false), std::nullopt, ""});
   return began;
@@ -43,16 +43,16 @@ QZMeasuredResult resultOf(double value) { return resultWithMinimum(value, 90); }
 std::vector<RunEvent> wholeDiagnostic(const std::string& name, double value) {
   const LogLine line{250ms, LogLevel::kError, "a line", momentAt(4)};
   return {beginningOf(name),
-          StageBegan{Stage::kSetup, momentAt(2)},
+          StageStarted{Stage::kSetup, momentAt(2)},
           StageEnded{Stage::kSetup, 0ns, momentAt(3)},
-          StageBegan{Stage::kRun, momentAt(3)},
+          StageStarted{Stage::kRun, momentAt(3)},
           Logged{line},
           StageEnded{Stage::kRun, 3s, momentAt(5)},
-          Measured{{{"Raw", Measurement(value, QZDimensionlessUnit::frames())}}},
-          Collected{"bytes", Bytes{0xA5}},
-          StageBegan{Stage::kAnalyse, momentAt(6)},
+          MeasurementsAdded{{{"Raw", Measurement(value, QZDimensionlessUnit::frames())}}},
+          AuxiliaryDataAdded{"bytes", Bytes{0xA5}},
+          StageStarted{Stage::kAnalyse, momentAt(6)},
           StageEnded{Stage::kAnalyse, std::nullopt, momentAt(7)},
-          Found{{resultOf(value)}},
+          ResultsReported{{resultOf(value)}},
           FaultsCounted{{{{{"operation", "CaptureStream.start"}}, 1}}},
           DiagnosticCompleted{}};
 }
@@ -62,7 +62,7 @@ std::vector<RunEvent> wholeRun() {
   append(events, closed(wholeDiagnostic("Good", 90)));
   append(events, closed(wholeDiagnostic("Bad", 89)));
   append(events, closed(wholeDiagnostic("Strange", std::numeric_limits<double>::quiet_NaN())));
-  append(events, closed({beginningOf("Broken"), StageBegan{Stage::kRun, momentAt(2)},
+  append(events, closed({beginningOf("Broken"), StageStarted{Stage::kRun, momentAt(2)},
                          Failed{Stage::kRun, errorWithMessage("Domain", -1, "it failed", nullptr)},
                          StageEnded{Stage::kRun, 1s, momentAt(5)}, DiagnosticCompleted{}}));
   events.emplace_back(RunEnded{std::nullopt, momentAt(99)});

@@ -23,14 +23,14 @@ inline Date momentAt(int milliseconds) {
   return Date(sys_days(year(2026) / 11 / 21)) + hours(1) + minutes(8) + std::chrono::milliseconds(milliseconds);
 }
 
-RunBegan runOf(std::vector<std::string> names);
+RunStarted runOf(std::vector<std::string> names);
 
-DiagnosticBegan beginningOf(const std::string& name);
+DiagnosticStarted beginningOf(const std::string& name);
 
 // A result that passes when its value is 90 or more.
 QZMeasuredResult resultOf(double value);
 
-// Of a diagnostic's run as it goes well, from DiagnosticBegan to DiagnosticCompleted, with every kind of event that
+// Of a diagnostic's run as it goes well, from DiagnosticStarted to DiagnosticCompleted, with every kind of event that
 // there is in it.
 std::vector<RunEvent> wholeDiagnostic(const std::string& name, double value);
 

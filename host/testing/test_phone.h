@@ -2,7 +2,7 @@
 #pragma once
 
 #include "host/device/phone.h"
-#include "host/plugin/idle_platform.h"
+#include "host/plugin/null_platform.h"
 
 #include <chrono>
 #include <memory>
@@ -24,7 +24,7 @@ class ManualClock final : public Clock {
 class TestPhone final : public Phone {
  public:
   Platform platform() const override {
-    Platform platform = idlePlatform();
+    Platform platform = nullPlatform();
     platform.clock = clock_;
     return platform;
   }

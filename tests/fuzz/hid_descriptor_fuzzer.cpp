@@ -18,7 +18,7 @@ void require(bool holds) {
 void requireReports(const HidReportDescriptor& descriptor, const std::map<std::uint8_t, std::uint32_t>& reports) {
   const std::uint32_t id = descriptor.numbered ? 1 : 0;
   for (const auto& [number, length] : reports) {
-    require(length >= id && length <= HidReportDescriptor::kLargestReport + id);
+    require(length >= id && length <= HidReportDescriptor::kMaxReport + id);
     require(descriptor.numbered || number == 0);
   }
 }

@@ -10,7 +10,7 @@
 extern "C" int LLVMFuzzerTestOneInput(const std::uint8_t* data, std::size_t size) {
   try {
     quazor::parseProfile("profile.json", std::string(reinterpret_cast<const char*>(data), size));
-  } catch (const quazor::Refusal& refusal) {
+  } catch (const quazor::CommandError& refusal) {
     if (std::string(refusal.what()).empty()) std::abort();
   }
   return 0;

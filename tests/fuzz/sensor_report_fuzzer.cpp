@@ -216,7 +216,7 @@ class ExperimentRun {
  public:
   ExperimentRun(Input& input, bool careless) : images_(input.byte()), timeout_(input.byte() % 3) {
     sensor_.device->careless = careless;
-    while (!input.empty() && batches_ < kMostBatches) planBatch(input);
+    while (!input.empty() && batches_ < kMaxBatches) planBatch(input);
   }
 
   void run() {
@@ -236,7 +236,7 @@ class ExperimentRun {
   }
 
  private:
-  static constexpr std::size_t kMostBatches = 64;
+  static constexpr std::size_t kMaxBatches = 64;
 
   void planBatch(Input& input) {
     std::vector<std::function<void()>> actions;

@@ -39,7 +39,7 @@ constexpr std::size_t kPayload = offsetof(uhid_event, u);
 
 }  // namespace
 
-UhidSensor::UhidSensor(FileDescriptor uhid, UhidSensorTraits traits)
+UhidSensor::UhidSensor(FileDescriptor uhid, UhidSensorConfig traits)
     : uhid_(std::move(uhid)),
       traits_(std::move(traits)),
       period_(static_cast<Time::rep>(std::llround(1e9 / traits_.rate))) {}

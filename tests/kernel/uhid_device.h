@@ -2,7 +2,7 @@
 #pragma once
 
 #include "backends/linux/system/file_descriptor.h"
-#include "backends/simulated/scenario/hid_traits.h"
+#include "backends/simulated/scenario/hid_config.h"
 #include "contract/value.h"
 
 #include <chrono>
@@ -18,7 +18,7 @@ struct uhid_event;
 
 namespace quazor {
 
-struct UhidSensorTraits {
+struct UhidSensorConfig {
   std::string name = "Display Sensor";
   double rate = 60;          // input reports per second
   std::size_t length = 792;  // of each, in bytes; behind an image of 792 bytes there are zeros
@@ -45,7 +45,7 @@ class UhidSensor {
   using Time = std::chrono::nanoseconds;
 
   // Takes /dev/uhid, opened for reading and writing. Call create() next.
-  UhidSensor(FileDescriptor uhid, UhidSensorTraits traits);
+  UhidSensor(FileDescriptor uhid, UhidSensorConfig traits);
   UhidSensor(const UhidSensor&) = delete;
   UhidSensor& operator=(const UhidSensor&) = delete;
 
@@ -76,7 +76,7 @@ class UhidSensor {
   bool sendReport(Time now);
 
   FileDescriptor uhid_;
-  const UhidSensorTraits traits_;
+  const UhidSensorConfig traits_;
   const Time period_;
   bool created_ = false;
   bool started_ = false;

@@ -27,7 +27,7 @@ using ::testing::SizeIs;
 // A sensor on connected sockets; this end is the kernel.
 class UhidDeviceTest : public ::testing::Test {
  protected:
-  void make(UhidSensorTraits traits) {
+  void make(UhidSensorConfig traits) {
     std::array<int, 2> ends{-1, -1};
     ASSERT_EQ(::socketpair(AF_UNIX, SOCK_SEQPACKET | SOCK_CLOEXEC | SOCK_NONBLOCK, 0, ends.data()), 0);
     kernel_ = FileDescriptor(ends[0]);
@@ -38,7 +38,7 @@ class UhidDeviceTest : public ::testing::Test {
     created_ = *created;
   }
   void make() {
-    UhidSensorTraits traits;
+    UhidSensorConfig traits;
     traits.rate = 100;
     make(traits);
   }
@@ -99,7 +99,7 @@ class UhidDeviceTest : public ::testing::Test {
 };
 
 TEST_F(UhidDeviceTest, TheKernelIsToldOfASensor) {
-  UhidSensorTraits traits;
+  UhidSensorConfig traits;
   traits.name = std::string(200, 'n');
   make(traits);
   EXPECT_EQ(size_, static_cast<ssize_t>(sizeof(uhid_event)));
@@ -137,7 +137,7 @@ TEST_F(UhidDeviceTest, ImagesComeWhileItIsOpenAndBothModesAreOn) {
 }
 
 TEST_F(UhidDeviceTest, ASensorMayAlwaysStream) {
-  UhidSensorTraits traits;
+  UhidSensorConfig traits;
   traits.alwaysStreams = true;
   traits.rate = 1;
   make(traits);
@@ -147,7 +147,7 @@ TEST_F(UhidDeviceTest, ASensorMayAlwaysStream) {
 }
 
 TEST_F(UhidDeviceTest, ReportsHaveTheLengthThatIsAskedFor) {
-  UhidSensorTraits traits;
+  UhidSensorConfig traits;
   traits.length = 4096;
   traits.images.firstFrameID = 5;
   make(traits);
@@ -158,7 +158,7 @@ TEST_F(UhidDeviceTest, ReportsHaveTheLengthThatIsAskedFor) {
 }
 
 TEST_F(UhidDeviceTest, FeatureReportsAreAnsweredRefusedOrIgnored) {
-  UhidSensorTraits traits;
+  UhidSensorConfig traits;
   traits.refuses = {0xAB};
   traits.ignores = {0xAC};
   make(traits);
@@ -190,7 +190,7 @@ TEST_F(UhidDeviceTest, ReadsOfFeatureReportsAreRefusedAndOtherEventsPassedOver) 
 }
 
 TEST_F(UhidDeviceTest, ASensorThatStopsSendsNoMore) {
-  UhidSensorTraits traits;
+  UhidSensorConfig traits;
   traits.stopsAfter = 2;
   make(traits);
   turnOn();
@@ -201,7 +201,7 @@ TEST_F(UhidDeviceTest, ASensorThatStopsSendsNoMore) {
 }
 
 TEST_F(UhidDeviceTest, ASensorThatIsRemovedSaysSoToTheKernelOnce) {
-  UhidSensorTraits traits;
+  UhidSensorConfig traits;
   traits.removedAfter = 2;
   make(traits);
   turnOn();

@@ -37,7 +37,7 @@ struct Options {
   std::size_t devices = 1;
   std::string uhid = "/dev/uhid";
   double seconds = 0;
-  UhidSensorTraits traits;
+  UhidSensorConfig traits;
   std::vector<unsigned> refuses;
   std::vector<unsigned> ignores;
 };
@@ -133,7 +133,7 @@ std::set<std::uint8_t> idsOf(const std::vector<unsigned>& numbers) {
 
 int main(int argc, char** argv) {
   quazor::Options options;
-  quazor::UhidSensorTraits& traits = options.traits;
+  quazor::UhidSensorConfig& traits = options.traits;
   CLI::App command("Makes display sensors out of /dev/uhid, and tells what they did.");
   command.add_option("--devices", options.devices, "How many, all alike")->check(CLI::Range(1, 16));
   command.add_option("--uhid", options.uhid, "The kernel's file for devices of programs");

@@ -13,7 +13,7 @@ namespace quazor::misbehaving {
 
 namespace {
 
-constexpr int kMostDescriptors = 1024;
+constexpr int kMaxDescriptors = 1024;
 constexpr int kFirstAfterStreams = 3;  // after the standard streams
 constexpr std::size_t kFlood = 100'000'000;
 
@@ -28,7 +28,7 @@ void writeAll(int descriptor, std::string_view text) {
 void closeFrom(int first) { ::syscall(SYS_close_range, first, ~0U, 0); }
 
 void writeToAll(int first, std::string_view text) {
-  for (int descriptor = first; descriptor < kMostDescriptors; ++descriptor) writeAll(descriptor, text);
+  for (int descriptor = first; descriptor < kMaxDescriptors; ++descriptor) writeAll(descriptor, text);
 }
 
 // Every octet, with and without an end of a line.

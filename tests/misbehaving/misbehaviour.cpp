@@ -16,7 +16,7 @@ namespace quazor::misbehaving {
 namespace {
 
 constexpr std::string_view kAnswer = "Answer";
-constexpr double kUsualAnswer = 42;
+constexpr double kDefaultAnswer = 42;
 
 void act(void (*what)()) {
   if (what != nullptr) what();
@@ -49,7 +49,7 @@ class Experiment final : public QZExperiment, public QZTeardown {
     if (misbehaviour_.measure != nullptr) {
       misbehaviour_.measure(*result);
     } else {
-      result->measurements().set(kAnswer, Measurement(kUsualAnswer, QZDimensionlessUnit::events()));
+      result->measurements().set(kAnswer, Measurement(kDefaultAnswer, QZDimensionlessUnit::events()));
     }
     return result;
   }
@@ -82,7 +82,7 @@ class Analysis final : public QZAnalysis {
     const Measurement* const answer = measured.measurements().find(kAnswer);
     QZMeasuredResult found(kAnswer, answer == nullptr ? Measurement(0, QZDimensionlessUnit::events()) : *answer);
     QZLimit limit("AnswerLimit");
-    limit.setLowerBound(std::make_shared<QZBound>(Measurement(kUsualAnswer, QZDimensionlessUnit::events()), false));
+    limit.setLowerBound(std::make_shared<QZBound>(Measurement(kDefaultAnswer, QZDimensionlessUnit::events()), false));
     found.setLimit(std::move(limit));
     result->measuredResults().push_back(std::move(found));
     return result;

@@ -18,7 +18,7 @@ using namespace std::chrono_literals;
 // Whoever sleeps lets the made-up cameras' time pass; `during` happens in the middle.
 class FakeClock final : public Clock {
  public:
-  explicit FakeClock(std::shared_ptr<FakeVideoKernel> kernel) : kernel_(std::move(kernel)) {}
+  explicit FakeClock(std::shared_ptr<FakeV4l2Api> kernel) : kernel_(std::move(kernel)) {}
 
   std::chrono::nanoseconds now() const override { return kernel_->now(); }
   Date date() const override { return Date(kernel_->now()); }
@@ -31,7 +31,7 @@ class FakeClock final : public Clock {
   std::function<void()> during;
 
  private:
-  const std::shared_ptr<FakeVideoKernel> kernel_;
+  const std::shared_ptr<FakeV4l2Api> kernel_;
 };
 
 struct Outcome {
@@ -86,7 +86,7 @@ class CameraSyncOnLinuxTest : public testing::Test {
 
   Fake fake_ = [] {
     Fake fake;
-    fake.letGo();
+    fake.release();
     return fake;
   }();
   const std::shared_ptr<FakeClock> clock_ = std::make_shared<FakeClock>(fake_.kernel);
@@ -124,7 +124,7 @@ TEST_F(CameraSyncOnLinuxTest, EveryRefusedStartEndsInItsErrorAndTheNextRunIsHeal
 TEST_F(CameraSyncOnLinuxTest, WhatHappensInMidStreamIsInTheCountersAndTheNextRunIsHealthy) {
   const struct {
     const char* name;
-    std::function<void(FakeVideoKernel&, const std::string&)> happens;
+    std::function<void(FakeV4l2Api&, const std::string&)> happens;
     const char* counter;
     std::int64_t count;
     double frames;
@@ -194,7 +194,7 @@ class ProjectorFaultOnLinuxTest : public testing::Test {
  protected:
   ProjectorFaultOnLinuxTest() {
     setMetadata({1, 0, 0, 0});
-    fake_.letGo();
+    fake_.release();
   }
   void setMetadata(std::vector<std::uint8_t> metadata) {
     fake_.kernel->with(fake_.nodes[3], [&](FakeNode& node) { return (node.metadata = std::move(metadata)).size(); });

@@ -17,7 +17,7 @@ namespace quazor {
 namespace {
 
 constexpr double kTimeout = 0.005;  // seconds
-constexpr std::chrono::milliseconds kLongestDelay(100);
+constexpr std::chrono::milliseconds kMaxDelay(100);
 
 struct Moment {
   std::chrono::steady_clock::time_point time = std::chrono::steady_clock::now();
@@ -111,7 +111,7 @@ TEST(PendingTimeout, TakesTheExperimentWithItWhenTheHostHasLetGo) {
     const Moment end = run.end();
     if (released.time >= timeout.time || end.thread == std::this_thread::get_id()) continue;  // the host was late
     EXPECT_EQ(end.thread, timeout.thread);
-    if (end.time - timeout.time < kLongestDelay) return;
+    if (end.time - timeout.time < kMaxDelay) return;
   }
   FAIL() << "the experiment did not go in time";
 }
@@ -130,7 +130,7 @@ TEST(PendingTimeout, HoldsNothingAfterItHasEndedTheRun) {
     RunWithTimeout run(false);
     const Moment timeout = run.timeout();
     run.release();  // at the moment at which the timeout lets go too
-    if (run.end().time - timeout.time < kLongestDelay) return;
+    if (run.end().time - timeout.time < kMaxDelay) return;
   }
   FAIL() << "the experiment did not go in time";
 }

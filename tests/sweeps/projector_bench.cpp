@@ -15,8 +15,8 @@ namespace quazor {
 
 namespace {
 
-ReportChannelTraits channel(std::string group, std::string subGroup, std::string name) {
-  ReportChannelTraits channel;
+ReportChannelConfig channel(std::string group, std::string subGroup, std::string name) {
+  ReportChannelConfig channel;
   channel.group = std::move(group);
   channel.subGroup = std::move(subGroup);
   channel.name = std::move(name);

@@ -47,8 +47,8 @@ TEST(EveryOrderTest, LeadsIntoEachOrderOnce) {
   do {
     VirtualScheduler scheduler(orders);
     std::string order;
-    const auto letters = scheduler.makeLane();
-    const auto digits = scheduler.makeLane();
+    const auto letters = scheduler.makeStrand();
+    const auto digits = scheduler.makeStrand();
     for (const char letter : {'a', 'b'}) scheduler.submit(letters, [&order, letter] { order += letter; });
     for (const char digit : {'1', '2', '3'}) scheduler.submit(digits, [&order, digit] { order += digit; });
     scheduler.blockUntil(std::chrono::seconds(1), "the end");
@@ -86,7 +86,7 @@ class ProjectorInterleavings : public testing::Test {
     ++plans_;
     ++orders_;
     const ProjectorRun run =
-        runVirtually(plan, std::make_shared<VirtualScheduler>(std::make_shared<SeededChooser>(seed)));
+        runVirtually(plan, std::make_shared<VirtualScheduler>(std::make_shared<RandomStrategy>(seed)));
     const std::string problem = problemOf(plan, run);
     ASSERT_EQ(problem, "") << describe(plan) << textOf(run.lines);
   }
@@ -213,7 +213,7 @@ TEST_F(ProjectorInterleavings, OfTwoThreadsOfTheCameraWithEvents) {
 
 // A larger plan, drawn by its seed.
 ProjectorPlan drawPlan(std::uint64_t seed) {
-  SeededChooser random(seed);
+  RandomStrategy random(seed);
   const auto chance = [&random](std::size_t oneIn) { return random.choose(oneIn) == 0; };
   ProjectorPlan plan;
   const std::size_t threads = 1 + random.choose(3);

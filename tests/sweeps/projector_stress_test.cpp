@@ -25,9 +25,9 @@
 namespace quazor {
 namespace {
 
-constexpr std::size_t kThreads = 3;           // of the camera
-constexpr std::size_t kFrames = 8;            // of each thread
-constexpr std::size_t kLongestTimeout = 600;  // microseconds
+constexpr std::size_t kThreads = 3;       // of the camera
+constexpr std::size_t kFrames = 8;        // of each thread
+constexpr std::size_t kMaxTimeout = 600;  // microseconds
 
 // What a round asks for: the frames that each thread delivers, in a burst or with pauses, when the run ends without a
 // bad one, and whether the host tears down before it lets go.
@@ -55,7 +55,7 @@ Round drawRound(std::minstd_rand& random) {
   round.hasPauses = random() % 2 == 0;
   // Mostly beside the last frame that can be the last one.
   round.stopCount = random() % 2 == 0 ? random() % most : most + random() % 2;
-  round.timeout = 1e-6 * static_cast<double>(random() % kLongestTimeout);
+  round.timeout = 1e-6 * static_cast<double>(random() % kMaxTimeout);
   round.hostTearsDown = random() % 2 == 0;
   return round;
 }

@@ -85,7 +85,7 @@ projector_oracle::Phone phoneOf(const Sweep& sweep, Scenario scenario) {
   for (std::size_t i = 0; i < phone.errorCounters.size(); ++i) {
     phone.errorCounters[i] = static_cast<int>(toSigned(infrared.errorCounters->find(counters[i])));
   }
-  for (const ReportChannelTraits& channel : scenario.reports) {
+  for (const ReportChannelConfig& channel : scenario.reports) {
     if (channel.subGroup == "K42ISP Events") {
       EXPECT_EQ(channel.growth, 0U) << channel.name << " grows with time, which the oracle does not know";
     }

@@ -35,7 +35,7 @@ class WatchedSemaphore final : public Semaphore {
 class SlowTimerQueue final : public SerialQueue {
  public:
   SlowTimerQueue(std::shared_ptr<SerialQueue> queue, VirtualScheduler& scheduler)
-      : queue_(std::move(queue)), scheduler_(scheduler), timer_(scheduler.makeLane()) {}
+      : queue_(std::move(queue)), scheduler_(scheduler), timer_(scheduler.makeStrand()) {}
 
   void async(Task task) override { queue_->async(std::move(task)); }
   void asyncAfter(std::chrono::nanoseconds delay, Task task) override {
@@ -46,7 +46,7 @@ class SlowTimerQueue final : public SerialQueue {
  private:
   std::shared_ptr<SerialQueue> queue_;
   VirtualScheduler& scheduler_;
-  std::shared_ptr<VirtualScheduler::Lane> timer_;
+  std::shared_ptr<VirtualScheduler::Strand> timer_;
 };
 
 class WatchedConcurrency final : public Concurrency {
@@ -124,10 +124,10 @@ class PlannedCamera {
   }
 
   void startDelivery() {
-    std::map<std::size_t, std::shared_ptr<VirtualScheduler::Lane>> threads;
+    std::map<std::size_t, std::shared_ptr<VirtualScheduler::Strand>> threads;
     for (std::size_t i = 0; i < plan_.deliveries.size(); ++i) {
       auto& thread = threads[plan_.deliveries[i].thread];
-      if (thread == nullptr) thread = scheduler_->makeLane();
+      if (thread == nullptr) thread = scheduler_->makeStrand();
       scheduler_->submitAt(scheduler_->after(plan_.deliveries[i].at), thread, [this, i] { deliver(i); });
     }
   }

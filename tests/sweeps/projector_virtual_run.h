@@ -1,7 +1,7 @@
 // Runs of the projector fault experiment in virtual time.
 #pragma once
 
-#include "backends/simulated/time/chooser.h"
+#include "backends/simulated/time/schedule_strategy.h"
 #include "backends/simulated/time/virtual_scheduler.h"
 #include "tests/sweeps/projector_trace.h"
 
@@ -14,7 +14,7 @@ namespace quazor {
 
 // Leads a program that is run again and again into every order of events there is, one after another: depth first, by
 // repeating the choices of the run before up to the last one that had another possibility.
-class EveryOrder final : public Chooser {
+class EveryOrder final : public ScheduleStrategy {
  public:
   // The next choice of this run.
   std::size_t choose(std::size_t count) override;

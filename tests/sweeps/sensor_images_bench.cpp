@@ -144,8 +144,8 @@ HidReportShape shapeOf(const sensor_oracle::Report& report) {
   return shape;
 }
 
-HidDeviceTraits traitsOf(const sensor_oracle::Sensor& sensor, std::string name) {
-  HidDeviceTraits traits;
+HidDeviceConfig traitsOf(const sensor_oracle::Sensor& sensor, std::string name) {
+  HidDeviceConfig traits;
   traits.name = std::move(name);
   traits.usagePage = static_cast<std::uint16_t>(sensor.usagePage);
   traits.usage = static_cast<std::uint16_t>(sensor.usage);

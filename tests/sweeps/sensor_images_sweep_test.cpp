@@ -380,7 +380,7 @@ TEST(SensorImagesSweepOfSeeds, AReportAtTheEndOfTheTimeComesInTimeOrTooLate) {
 }
 
 TEST(SensorImagesSweepOfParameters, EveryParameterMayBeMissingOrOdd) {
-  constexpr std::uint64_t kMost = std::numeric_limits<std::uint64_t>::max();
+  constexpr std::uint64_t kMaxCount = std::numeric_limits<std::uint64_t>::max();
   const struct {
     const char* name;
     std::optional<Value> value;
@@ -396,11 +396,11 @@ TEST(SensorImagesSweepOfParameters, EveryParameterMayBeMissingOrOdd) {
       {"less than one", 0.999, 0},
       {"a little below zero", -0.5, 0},
       {"minus three as a double", -3.0, 0},
-      {"minus one", -1, kMost},
+      {"minus one", -1, kMaxCount},
       {"the least integer", std::numeric_limits<std::int64_t>::min(), std::uint64_t{1} << 63U},
-      {"the largest number", kMost, kMost},
-      {"a huge double", 1e300, kMost},
-      {"infinity", std::numeric_limits<double>::infinity(), kMost},
+      {"the largest number", kMaxCount, kMaxCount},
+      {"a huge double", 1e300, kMaxCount},
+      {"infinity", std::numeric_limits<double>::infinity(), kMaxCount},
       {"minus infinity", -std::numeric_limits<double>::infinity(), 0},
       {"not a number", std::numeric_limits<double>::quiet_NaN(), 0},
       {"a string", "2", 0},

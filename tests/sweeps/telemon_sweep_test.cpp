@@ -47,7 +47,7 @@ class TelemonSweep : public testing::Test {
           failure.hasError ? std::optional<std::string>("SweepErrorDomain code -3: Made to fail.") : std::nullopt;
     }
     std::vector<projector_oracle::PhoneChannel> channels;
-    for (const ReportChannelTraits& channel : scenario.reports) {
+    for (const ReportChannelConfig& channel : scenario.reports) {
       channels.push_back({channel.group, channel.subGroup, channel.name, channel.count});
     }
     const auto prediction = projector_oracle::predictPresenceRun(channels, failures, place == ErrorPlace::kGiven);

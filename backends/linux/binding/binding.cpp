@@ -17,13 +17,13 @@ namespace {
 constexpr std::array kPorts{port_type::BackFacingCamera, port_type::BackFacingTelephotoCamera,
                             port_type::BackFacingSuperWideCamera, port_type::FrontFacingCamera,
                             port_type::FrontFacingInfraredCamera};
-constexpr std::uint64_t kLargestSide = 65536;
-constexpr std::uint64_t kFewestBuffers = 2;
-constexpr std::uint64_t kMostBuffers = 32;       // VIDEO_MAX_FRAME of linux/videodev2.h
-constexpr std::size_t kLongestControlName = 31;  // v4l2_query_ext_ctrl has 32 bytes for it and its end
-constexpr std::size_t kLongestDriver = 15;       // v4l2_capability, likewise
-constexpr std::size_t kLongestCard = 31;
-constexpr std::size_t kLongestBusInfo = 31;
+constexpr std::uint64_t kMaxSide = 65536;
+constexpr std::uint64_t kMinBuffers = 2;
+constexpr std::uint64_t kMaxBuffers = 32;          // VIDEO_MAX_FRAME of linux/videodev2.h
+constexpr std::size_t kMaxControlNameLength = 31;  // v4l2_query_ext_ctrl has 32 bytes for it and its end
+constexpr std::size_t kMaxDriverLength = 15;       // v4l2_capability, likewise
+constexpr std::size_t kMaxCardLength = 31;
+constexpr std::size_t kMaxBusInfoLength = 31;
 constexpr std::uint64_t kLastMetadataByte = 16777215;  // of a buffer
 
 // A key that means nothing, but must be a text where it is there.
@@ -41,8 +41,8 @@ std::vector<std::pair<std::string, JsonCursor>> namedEntries(const JsonCursor& c
 }
 
 std::string readControlName(const std::string& name, const JsonCursor& cursor) {
-  if (name.size() <= kLongestControlName) return name;
-  cursor.fail(inQuotes(name) + " is no control's name, which has at most " + std::to_string(kLongestControlName) +
+  if (name.size() <= kMaxControlNameLength) return name;
+  cursor.fail(inQuotes(name) + " is no control's name, which has at most " + std::to_string(kMaxControlNameLength) +
               " characters.");
 }
 
@@ -64,8 +64,9 @@ std::optional<std::string> findControl(const JsonCursor& cursor, std::string_vie
 
 VideoNodeMatch readMatch(const JsonCursor& cursor) {
   cursor.allowKeys({"driver", "card", "busInfo"});
-  VideoNodeMatch match{findDeviceText(cursor, "driver", kLongestDriver), findDeviceText(cursor, "card", kLongestCard),
-                       findDeviceText(cursor, "busInfo", kLongestBusInfo)};
+  VideoNodeMatch match{findDeviceText(cursor, "driver", kMaxDriverLength),
+                       findDeviceText(cursor, "card", kMaxCardLength),
+                       findDeviceText(cursor, "busInfo", kMaxBusInfoLength)};
   if (!match.driver && !match.card && !match.busInfo) {
     cursor.fail("give at least one of \"driver\", \"card\" and \"busInfo\"; quazor phone probe shows them.");
   }
@@ -161,10 +162,10 @@ CameraBinding readCamera(const std::string& port, const JsonCursor& cursor) {
   camera.node = readMatch(cursor.at("node"));
   const JsonCursor size = cursor.at("size");
   size.allowKeys({"width", "height"});
-  camera.width = static_cast<std::uint32_t>(size.at("width").integer(1, kLargestSide));
-  camera.height = static_cast<std::uint32_t>(size.at("height").integer(1, kLargestSide));
+  camera.width = static_cast<std::uint32_t>(size.at("width").integer(1, kMaxSide));
+  camera.height = static_cast<std::uint32_t>(size.at("height").integer(1, kMaxSide));
   if (const auto buffers = cursor.find("buffers")) {
-    camera.buffers = static_cast<std::uint32_t>(buffers->integer(kFewestBuffers, kMostBuffers));
+    camera.buffers = static_cast<std::uint32_t>(buffers->integer(kMinBuffers, kMaxBuffers));
   }
   if (const auto controls = cursor.find("controls")) camera.controls = readSettings(*controls);
   if (const auto metadata = cursor.find("metadata")) camera.metadata = readMetadata(*metadata);

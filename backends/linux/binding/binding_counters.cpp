@@ -16,7 +16,7 @@ namespace quazor {
 namespace {
 
 constexpr std::string_view kNameAsKey = "{name}";
-constexpr std::size_t kLongestPath = 4095;  // PATH_MAX of linux/limits.h without its end
+constexpr std::size_t kMaxPathLength = 4095;  // PATH_MAX of linux/limits.h without its end
 
 struct Part {
   std::string_view key;
@@ -145,8 +145,8 @@ std::vector<TracepointBinding> readAllTracepoints(const JsonCursor& cursor) { re
 std::string readPathText(const JsonCursor& cursor) {
   std::string path = cursor.text();
   if (!path.starts_with('/')) cursor.fail("must be an absolute path, as \"/sys/...\".");
-  if (path.size() > kLongestPath) {
-    cursor.fail("is longer than a path can be, which is " + std::to_string(kLongestPath) + " bytes.");
+  if (path.size() > kMaxPathLength) {
+    cursor.fail("is longer than a path can be, which is " + std::to_string(kMaxPathLength) + " bytes.");
   }
   if (path.find('\0') != std::string::npos) cursor.fail("no path can hold the character \\u0000.");
   for (std::size_t begin = 1; begin <= path.size();) {

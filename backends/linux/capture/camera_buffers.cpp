@@ -15,7 +15,7 @@ std::chrono::nanoseconds timeOf(const timeval& time) {
 
 }  // namespace
 
-CameraBuffers::CameraBuffers(std::shared_ptr<OpenedVideoNode> node, std::uint32_t type)
+CameraBuffers::CameraBuffers(std::shared_ptr<V4l2Device> node, std::uint32_t type)
     : node_(std::move(node)), type_(type) {}
 
 CameraBuffers::~CameraBuffers() { release(nullptr); }

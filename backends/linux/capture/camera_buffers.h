@@ -1,7 +1,7 @@
 // CameraBuffers: the mapped buffers of one video or metadata node, from the request for them to their release.
 #pragma once
 
-#include "backends/linux/video/video_node.h"
+#include "backends/linux/video/v4l2_device.h"
 
 #include <cstddef>
 #include <cstdint>
@@ -27,12 +27,12 @@ struct DequeuedBuffer {
 class CameraBuffers final {
  public:
   // `type` is V4L2_BUF_TYPE_VIDEO_CAPTURE or V4L2_BUF_TYPE_META_CAPTURE.
-  CameraBuffers(std::shared_ptr<OpenedVideoNode> node, std::uint32_t type);
+  CameraBuffers(std::shared_ptr<V4l2Device> node, std::uint32_t type);
   CameraBuffers(const CameraBuffers&) = delete;
   CameraBuffers& operator=(const CameraBuffers&) = delete;
   ~CameraBuffers();
 
-  const OpenedVideoNode& node() const { return *node_; }
+  const V4l2Device& node() const { return *node_; }
 
   // Requests, maps and queues buffers; the driver may give more or fewer than `count`.
   bool prepare(std::uint32_t count, DiagnosticErrorPtr* error);
@@ -61,7 +61,7 @@ class CameraBuffers final {
   bool map(std::uint32_t index, DiagnosticErrorPtr* error);
   v4l2_buffer bufferOf(std::uint32_t index) const;
 
-  const std::shared_ptr<OpenedVideoNode> node_;
+  const std::shared_ptr<V4l2Device> node_;
   const std::uint32_t type_;
   std::vector<Mapped> mapped_;          // by the buffer's index
   std::vector<std::uint32_t> refused_;  // by the driver, which did not take them back

@@ -25,8 +25,8 @@ constexpr std::array kHandlers{capture_key::PixelBufferHandler, capture_key::Eve
 constexpr std::array kSlaveKeys{capture_key::StreamingOutputsEnabled, capture_key::FrameSkippingEnabled,
                                 capture_key::TimeMachineEnabled, capture_key::MasterToSlaveFrameRateRatio};
 
-constexpr double kLowestRate = 0.01;
-constexpr double kHighestRate = 10'000;
+constexpr double kMinRate = 0.01;
+constexpr double kMaxRate = 10'000;
 
 bool isNumber(const Value& value) { return value.isNumber() && value.boolean() == nullptr; }
 
@@ -84,9 +84,9 @@ bool isIndex(std::string_view object, std::string_view key, const Value& value, 
 
 bool isRate(std::string_view object, std::string_view key, const Value& value, DiagnosticErrorPtr* error) {
   const double rate = toDouble(&value);
-  if (isNumber(value) && rate >= kLowestRate && rate <= kHighestRate) return true;
+  if (isNumber(value) && rate >= kMinRate && rate <= kMaxRate) return true;
   return refuseLinux(error, LinuxErrorCode::kBadValue, "%@: %@ takes a number from %@ to %@, not %@.", object, key,
-                     kLowestRate, kHighestRate, value);
+                     kMinRate, kMaxRate, value);
 }
 
 bool isLightSource(std::string_view object, const Value& value, DiagnosticErrorPtr* error) {

@@ -15,7 +15,7 @@ namespace quazor {
 namespace {
 
 // What the diagnostics of the infrared camera read.
-constexpr std::array<std::string_view, 6> kUsualCounters{
+constexpr std::array<std::string_view, 6> kDefaultCounters{
     capture_key::I2CErrorCount, capture_key::MIPIErrorCount, "LPDPErrorCount", "UARTErrorCount", "SIFErrorCount",
     "ProjectorErrorCount"};
 
@@ -35,7 +35,7 @@ std::optional<std::uint64_t> numberIn(const std::filesystem::path& file, Diagnos
   return std::nullopt;
 }
 
-std::optional<std::uint64_t> read(const ErrorCounterBinding& binding, const OpenedVideoNode& node,
+std::optional<std::uint64_t> read(const ErrorCounterBinding& binding, const V4l2Device& node,
                                   DiagnosticErrorPtr* error) {
   if (binding.file) return numberIn(*binding.file, error);
   const VideoControl* const control = node.control(binding.control.value_or(""), error);
@@ -69,7 +69,7 @@ std::int64_t frameOffset(const FrameCounts& camera, const FrameCounts& master, F
 }
 
 std::optional<BoundCounters> BoundCounters::begin(const std::vector<ErrorCounterBinding>& counters,
-                                                  const OpenedVideoNode& node, DiagnosticErrorPtr* error) {
+                                                  const V4l2Device& node, DiagnosticErrorPtr* error) {
   BoundCounters begun;
   for (const ErrorCounterBinding& binding : counters) {
     const std::optional<std::uint64_t> base = read(binding, node, error);
@@ -79,7 +79,7 @@ std::optional<BoundCounters> BoundCounters::begin(const std::vector<ErrorCounter
   return begun;
 }
 
-bool BoundCounters::addTo(Dictionary& dictionary, const OpenedVideoNode& node, DiagnosticErrorPtr* error) const {
+bool BoundCounters::addTo(Dictionary& dictionary, const V4l2Device& node, DiagnosticErrorPtr* error) const {
   for (const Counter& counter : counters_) {
     const std::optional<std::uint64_t> value = read(counter.binding, node, error);
     if (!value) return false;
@@ -90,7 +90,7 @@ bool BoundCounters::addTo(Dictionary& dictionary, const OpenedVideoNode& node, D
 
 Dictionary errorCountersOf(const std::vector<ErrorCounterBinding>& bound) {
   Dictionary counters;
-  for (const std::string_view name : kUsualCounters) counters.set(name, 0U);
+  for (const std::string_view name : kDefaultCounters) counters.set(name, 0U);
   for (const ErrorCounterBinding& counter : bound) counters.set(counter.name, 0U);
   addKernelCounters(counters, FrameCounts());
   return counters;

@@ -2,7 +2,7 @@
 #pragma once
 
 #include "backends/linux/binding/binding.h"
-#include "backends/linux/video/video_node.h"
+#include "backends/linux/video/v4l2_device.h"
 #include "contract/diagnostic_error.h"
 #include "contract/value.h"
 
@@ -52,12 +52,12 @@ std::int64_t frameOffset(const FrameCounts& camera, const FrameCounts& master, F
 class BoundCounters final {
  public:
   // What they are at the start of a stream; from there on they count. Nothing, and an error, when one cannot be read.
-  static std::optional<BoundCounters> begin(const std::vector<ErrorCounterBinding>& counters,
-                                            const OpenedVideoNode& node, DiagnosticErrorPtr* error);
+  static std::optional<BoundCounters> begin(const std::vector<ErrorCounterBinding>& counters, const V4l2Device& node,
+                                            DiagnosticErrorPtr* error);
 
   // By how much they have grown; one that is below what it was has begun anew, from 0. False, and an error, when one
   // cannot be read.
-  bool addTo(Dictionary& dictionary, const OpenedVideoNode& node, DiagnosticErrorPtr* error) const;
+  bool addTo(Dictionary& dictionary, const V4l2Device& node, DiagnosticErrorPtr* error) const;
 
  private:
   struct Counter {

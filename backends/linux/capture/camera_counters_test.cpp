@@ -67,7 +67,7 @@ class BoundCountersTest : public testing::Test {
     FakeNode camera = fakeCamera("fake:0");
     camera.controls = {{V4L2_CID_BRIGHTNESS, "Errors", 0, 1000, 10}};
     path_ = kernel_->add(0, std::move(camera));
-    node_ = OpenedVideoNode::open(kernel_, path_, nullptr);
+    node_ = V4l2Device::open(kernel_, path_, nullptr);
     write("5\n");
   }
 
@@ -78,9 +78,9 @@ class BoundCountersTest : public testing::Test {
     return counters.addTo(values, *node_, &error) ? defaultText(values) : error->localizedDescription();
   }
 
-  std::shared_ptr<FakeVideoKernel> kernel_ = std::make_shared<FakeVideoKernel>();
+  std::shared_ptr<FakeV4l2Api> kernel_ = std::make_shared<FakeV4l2Api>();
   std::string path_;
-  std::shared_ptr<OpenedVideoNode> node_;
+  std::shared_ptr<V4l2Device> node_;
   const std::filesystem::path file_ = kernel_->roots().sysfs / "crc_errors";
   const std::vector<ErrorCounterBinding> bindings_{{"MIPIErrorCount", file_, {}}, {"I2CErrorCount", {}, "Errors"}};
 };

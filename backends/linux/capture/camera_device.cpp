@@ -11,12 +11,12 @@
 namespace quazor {
 namespace {
 
-std::shared_ptr<OpenedVideoNode> openMatching(const std::shared_ptr<VideoKernel>& kernel,
-                                              const std::vector<VideoNode>& nodes, VideoNodeKind kind,
-                                              const VideoNodeMatch& match, const std::string& port,
-                                              DiagnosticErrorPtr* error) {
-  const std::optional<VideoNode> node = findVideoNode(nodes, kind, match, port, error);
-  return node ? OpenedVideoNode::open(kernel, node->path.string(), error) : nullptr;
+std::shared_ptr<V4l2Device> openMatching(const std::shared_ptr<V4l2Api>& kernel,
+                                         const std::vector<V4l2DeviceInfo>& nodes, VideoNodeKind kind,
+                                         const VideoNodeMatch& match, const std::string& port,
+                                         DiagnosticErrorPtr* error) {
+  const std::optional<V4l2DeviceInfo> node = findVideoNode(nodes, kind, match, port, error);
+  return node ? V4l2Device::open(kernel, node->path.string(), error) : nullptr;
 }
 
 }  // namespace
@@ -43,7 +43,7 @@ FrameInterval intervalFor(double framesPerSecond) {
   return {1000, static_cast<std::uint32_t>(std::lround(framesPerSecond * 1000))};
 }
 
-bool LinuxCamera::open(const std::shared_ptr<VideoKernel>& kernel, const std::vector<VideoNode>& nodes,
+bool LinuxCamera::open(const std::shared_ptr<V4l2Api>& kernel, const std::vector<V4l2DeviceInfo>& nodes,
                        DiagnosticErrorPtr* error) {
   settings_ = CameraSettings();
   node_ = openMatching(kernel, nodes, VideoNodeKind::kCamera, binding_.node, port(), error);
@@ -57,7 +57,7 @@ bool LinuxCamera::open(const std::shared_ptr<VideoKernel>& kernel, const std::ve
 }
 
 bool LinuxCamera::prepare(DiagnosticErrorPtr* error) {
-  const bool prepared = node_->takeAlone(error) &&
+  const bool prepared = node_->lockExclusive(error) &&
                         (!binding_.projector || node_->set(binding_.projector->off, error)) &&
                         node_->set(binding_.controls, error);
   if (prepared) settings_.autoExposure = exposesAutomatically();

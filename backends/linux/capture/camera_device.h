@@ -3,7 +3,7 @@
 
 #include "backends/linux/binding/binding.h"
 #include "backends/linux/capture/camera_run.h"
-#include "backends/linux/video/video_nodes.h"
+#include "backends/linux/video/v4l2_device_info.h"
 #include "contract/value.h"
 
 #include <cstdint>
@@ -63,7 +63,8 @@ class LinuxCamera final {
 
   // Finds and opens the camera's nodes among those that there are, puts its projector out and sets the binding's
   // controls. On failure nothing is left open. The settings are new; automatic exposure is as the driver has it.
-  bool open(const std::shared_ptr<VideoKernel>& kernel, const std::vector<VideoNode>& nodes, DiagnosticErrorPtr* error);
+  bool open(const std::shared_ptr<V4l2Api>& kernel, const std::vector<V4l2DeviceInfo>& nodes,
+            DiagnosticErrorPtr* error);
   void close();
 
   // REQUIRES, for what follows: open. Each changes the setting only when the driver did as it was told.
@@ -87,8 +88,8 @@ class LinuxCamera final {
 
   const CameraBinding binding_;
   CameraSettings settings_;
-  std::shared_ptr<OpenedVideoNode> node_;
-  std::shared_ptr<OpenedVideoNode> metadataNode_;
+  std::shared_ptr<V4l2Device> node_;
+  std::shared_ptr<V4l2Device> metadataNode_;
 };
 
 }  // namespace quazor

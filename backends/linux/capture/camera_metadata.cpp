@@ -12,7 +12,7 @@ std::optional<std::uint64_t> fieldIn(std::span<const std::uint8_t> buffer, const
   return number >> field.shift & field.mask.value_or(~std::uint64_t{0});
 }
 
-std::unique_ptr<CameraMetadata> CameraMetadata::make(const MetadataBinding& binding, const OpenedVideoNode& camera,
+std::unique_ptr<CameraMetadata> CameraMetadata::make(const MetadataBinding& binding, const V4l2Device& camera,
                                                      DiagnosticErrorPtr* error) {
   std::unique_ptr<CameraMetadata> metadata(new CameraMetadata(binding));
   for (const MetadataControl& one : binding.controls) {
@@ -23,7 +23,7 @@ std::unique_ptr<CameraMetadata> CameraMetadata::make(const MetadataBinding& bind
   return metadata;
 }
 
-Dictionary CameraMetadata::readControls(const OpenedVideoNode& camera) const {
+Dictionary CameraMetadata::readControls(const V4l2Device& camera) const {
   Dictionary values;
   for (const Control& one : controls_) {
     if (const std::optional<std::int64_t> value = camera.read(one.control, nullptr)) values.set(one.key, *value);

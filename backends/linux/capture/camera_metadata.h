@@ -3,7 +3,7 @@
 
 #include "backends/linux/binding/binding.h"
 #include "backends/linux/capture/camera_pairing.h"
-#include "backends/linux/video/video_node.h"
+#include "backends/linux/video/v4l2_device.h"
 #include "contract/value.h"
 
 #include <cstdint>
@@ -21,11 +21,11 @@ std::optional<std::uint64_t> fieldIn(std::span<const std::uint8_t> buffer, const
 class CameraMetadata final {
  public:
   // Null, and an error, when the binding names a control that the camera does not have.
-  static std::unique_ptr<CameraMetadata> make(const MetadataBinding& binding, const OpenedVideoNode& camera,
+  static std::unique_ptr<CameraMetadata> make(const MetadataBinding& binding, const V4l2Device& camera,
                                               DiagnosticErrorPtr* error);
 
   // The controls that are read with every frame; one that cannot be read is missing.
-  Dictionary readControls(const OpenedVideoNode& camera) const;
+  Dictionary readControls(const V4l2Device& camera) const;
 
   // The frame's dictionary: constants, then fields, then controls. What ought to have come from a metadata buffer or a
   // control and did not is left out, even where a constant has the same key; then `complete` is false.

@@ -33,7 +33,7 @@ class CameraMetadataNodeTest : public testing::Test {
     FakeNode camera = fakeCamera("fake:0");
     camera.controls = {{V4L2_CID_BRIGHTNESS, "Brightness", 0, 255, 12}};
     path_ = kernel_->add(0, std::move(camera));
-    node_ = OpenedVideoNode::open(kernel_, path_, nullptr);
+    node_ = V4l2Device::open(kernel_, path_, nullptr);
     binding_.constants = Dictionary{{"A", 1}, {"B", 2}, {"C", 3}};
     binding_.fields = {{"B", 0, 1, 0, {}}, {"D", 1, 1, 0, {}}};
     binding_.controls = {{"D", "Brightness"}};
@@ -47,9 +47,9 @@ class CameraMetadataNodeTest : public testing::Test {
     return text;
   }
 
-  std::shared_ptr<FakeVideoKernel> kernel_ = std::make_shared<FakeVideoKernel>();
+  std::shared_ptr<FakeV4l2Api> kernel_ = std::make_shared<FakeV4l2Api>();
   std::string path_;
-  std::shared_ptr<OpenedVideoNode> node_;
+  std::shared_ptr<V4l2Device> node_;
   MetadataBinding binding_;
 };
 

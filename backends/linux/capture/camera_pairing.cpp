@@ -5,12 +5,12 @@
 namespace quazor {
 
 void FramePairing::addFrame(CapturedFrame frame, std::chrono::nanoseconds now) {
-  frames_.push_back({std::move(frame), now + kLongestWait});
+  frames_.push_back({std::move(frame), now + kMaxWait});
 }
 
 void FramePairing::addMetadata(std::chrono::nanoseconds timestamp, std::vector<std::uint8_t> contents) {
   metadata_.push_back({timestamp, std::move(contents)});
-  if (metadata_.size() > kMostMetadata) metadata_.pop_front();  // of a node whose camera delivers nothing
+  if (metadata_.size() > kMaxMetadata) metadata_.pop_front();  // of a node whose camera delivers nothing
 }
 
 std::optional<CapturedFrame> FramePairing::next(std::chrono::nanoseconds now) {

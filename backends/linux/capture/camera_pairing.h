@@ -28,7 +28,7 @@ class FramePairing final {
   // Stamps that differ by at most this are the same moment: V4L2 gives them in microseconds.
   static constexpr std::chrono::nanoseconds kTolerance = std::chrono::microseconds(2);
   // How long a frame waits for its metadata.
-  static constexpr std::chrono::nanoseconds kLongestWait = std::chrono::milliseconds(100);
+  static constexpr std::chrono::nanoseconds kMaxWait = std::chrono::milliseconds(100);
 
   void addFrame(CapturedFrame frame, std::chrono::nanoseconds now);
   void addMetadata(std::chrono::nanoseconds timestamp, std::vector<std::uint8_t> contents);
@@ -50,7 +50,7 @@ class FramePairing final {
     std::vector<std::uint8_t> contents;
   };
 
-  static constexpr std::size_t kMostMetadata = 64;
+  static constexpr std::size_t kMaxMetadata = 64;
 
   std::deque<Waiting> frames_;
   std::deque<Metadata> metadata_;

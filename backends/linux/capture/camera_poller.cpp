@@ -16,7 +16,7 @@ namespace quazor {
 
 // Shared with the thread, which may outlive the poller by the end of the call in which it destroyed it.
 struct CameraPoller::State {
-  explicit State(std::shared_ptr<VideoKernel> videoKernel) : kernel(std::move(videoKernel)) {}
+  explicit State(std::shared_ptr<V4l2Api> videoKernel) : kernel(std::move(videoKernel)) {}
   State(const State&) = delete;
   State& operator=(const State&) = delete;
   ~State() {
@@ -33,7 +33,7 @@ struct CameraPoller::State {
     return std::ranges::any_of(streams, [stream](const auto& one) { return one.get() == stream; });
   }
 
-  const std::shared_ptr<VideoKernel> kernel;
+  const std::shared_ptr<V4l2Api> kernel;
   int event = -1;  // wakes the thread; written before the thread begins
 
   std::mutex mutex;  // guards what follows
@@ -98,7 +98,7 @@ void CameraPoller::State::serve(std::unique_lock<std::mutex>& lock, const std::s
   changed.notify_all();
 }
 
-CameraPoller::CameraPoller(std::shared_ptr<VideoKernel> kernel) : state_(std::make_shared<State>(std::move(kernel))) {}
+CameraPoller::CameraPoller(std::shared_ptr<V4l2Api> kernel) : state_(std::make_shared<State>(std::move(kernel))) {}
 
 CameraPoller::~CameraPoller() {
   State::Streams left;  // destroyed without the lock

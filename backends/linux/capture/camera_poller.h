@@ -1,7 +1,7 @@
 // CameraPoller: the one thread of a capture device that waits for its streams' descriptors.
 #pragma once
 
-#include "backends/linux/video/video_kernel.h"
+#include "backends/linux/video/v4l2_api.h"
 #include "contract/diagnostic_error.h"
 
 #include <chrono>
@@ -33,7 +33,7 @@ class PolledStream {
 // The thread begins with the first stream and ends with the poller. Thread: any.
 class CameraPoller final {
  public:
-  explicit CameraPoller(std::shared_ptr<VideoKernel> kernel);
+  explicit CameraPoller(std::shared_ptr<V4l2Api> kernel);
   CameraPoller(const CameraPoller&) = delete;
   CameraPoller& operator=(const CameraPoller&) = delete;
   // May be called on the thread itself, by what it serves.

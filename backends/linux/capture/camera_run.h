@@ -23,8 +23,8 @@ struct CameraRunPlan {
   FrameInterval interval;                       // between frames, as the driver has it
   std::shared_ptr<PixelBufferHandler> handler;  // may be null: frames are then only counted
   std::vector<ControlSetting> light;            // set before the first frame; empty: the projector stays dark
-  std::shared_ptr<OpenedVideoNode> node;
-  std::shared_ptr<OpenedVideoNode> metadataNode;  // may be null
+  std::shared_ptr<V4l2Device> node;
+  std::shared_ptr<V4l2Device> metadataNode;  // may be null
 };
 
 // Frames whose handlers have been called, of all cameras.
@@ -75,8 +75,8 @@ class CameraRun final : public PolledStream {
 
   // Until end(); then null, which needs the mutex for who is not the poller's thread.
   std::shared_ptr<PixelBufferHandler> handler_;
-  std::shared_ptr<OpenedVideoNode> node_;
-  std::shared_ptr<OpenedVideoNode> metadataNode_;
+  std::shared_ptr<V4l2Device> node_;
+  std::shared_ptr<V4l2Device> metadataNode_;
   std::unique_ptr<CameraBuffers> video_;
   std::unique_ptr<CameraBuffers> metadata_;
 

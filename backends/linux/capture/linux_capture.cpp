@@ -15,7 +15,7 @@ constexpr std::string_view kDeviceName = "capture device";
 
 class LinuxDevice final : public CaptureDevice {
  public:
-  explicit LinuxDevice(std::shared_ptr<LinuxUser> user) : user_(std::move(user)) {
+  explicit LinuxDevice(std::shared_ptr<LinuxCaptureClient> user) : user_(std::move(user)) {
     const LinuxCameras& cameras = user_->cameras();
     for (std::size_t i = 0; i < cameras.cameras.size(); ++i)
       streams_.push_back(std::make_shared<LinuxStream>(user_, i));
@@ -41,7 +41,7 @@ class LinuxDevice final : public CaptureDevice {
   }
 
   bool relinquishControlOfStreams(const CaptureStreams& streams, DiagnosticErrorPtr* error) override {
-    return user_->perform(error, [&] { return giveBackAll(streams, error); });
+    return user_->perform(error, [&] { return releaseAll(streams, error); });
   }
 
   bool invalidate(DiagnosticErrorPtr* error) override { return user_->invalidate(error); }
@@ -65,20 +65,20 @@ class LinuxDevice final : public CaptureDevice {
   }
 
   bool takeAll(const CaptureStreams& streams, DiagnosticErrorPtr* error);
-  bool giveBackAll(const CaptureStreams& streams, DiagnosticErrorPtr* error);
+  bool releaseAll(const CaptureStreams& streams, DiagnosticErrorPtr* error);
   std::optional<Value> read(std::string_view key, DiagnosticErrorPtr* error) const;
   bool set(const Value& value, std::string_view key, DiagnosticErrorPtr* error);
   bool readGroups(const Value& value, std::vector<std::size_t>& groups, DiagnosticErrorPtr* error) const;
   bool checkGroup(const LinuxGroupState& group, DiagnosticErrorPtr* error) const;
 
-  const std::shared_ptr<LinuxUser> user_;
+  const std::shared_ptr<LinuxCaptureClient> user_;
   std::vector<std::shared_ptr<LinuxStream>> streams_;  // by the camera's index
   std::vector<std::shared_ptr<LinuxGroup>> groups_;    // by the group's index
 };
 
 bool LinuxDevice::takeAll(const CaptureStreams& streams, DiagnosticErrorPtr* error) {
   LinuxCameras& cameras = user_->cameras();
-  const std::vector<VideoNode> nodes = videoNodes(cameras.kernel, cameras.roots);
+  const std::vector<V4l2DeviceInfo> nodes = videoNodes(cameras.kernel, cameras.roots);
   std::vector<LinuxCamera*> taken;
   for (const std::shared_ptr<CaptureStream>& stream : streams) {
     LinuxCamera* const camera = cameraOf(stream, error);
@@ -89,13 +89,13 @@ bool LinuxDevice::takeAll(const CaptureStreams& streams, DiagnosticErrorPtr* err
       taken.push_back(camera);
       continue;
     }
-    for (LinuxCamera* one : taken) cameras.letGo(*one);
+    for (LinuxCamera* one : taken) cameras.release(*one);
     return false;
   }
   return true;
 }
 
-bool LinuxDevice::giveBackAll(const CaptureStreams& streams, DiagnosticErrorPtr* error) {
+bool LinuxDevice::releaseAll(const CaptureStreams& streams, DiagnosticErrorPtr* error) {
   std::vector<LinuxCamera*> given;
   for (const std::shared_ptr<CaptureStream>& stream : streams) {
     LinuxCamera* const camera = cameraOf(stream, error);
@@ -105,7 +105,7 @@ bool LinuxDevice::giveBackAll(const CaptureStreams& streams, DiagnosticErrorPtr*
     }
     given.push_back(camera);
   }
-  for (LinuxCamera* camera : given) user_->cameras().letGo(*camera);
+  for (LinuxCamera* camera : given) user_->cameras().release(*camera);
   return true;
 }
 
@@ -186,7 +186,8 @@ class LinuxPlugIn final : public CapturePlugIn {
   std::string description() const override { return "capture plug-in"; }
 
   std::shared_ptr<CaptureDevice> device(DiagnosticErrorPtr* error) override {
-    if (!cameras_->cameras.empty()) return std::make_shared<LinuxDevice>(std::make_shared<LinuxUser>(cameras_));
+    if (!cameras_->cameras.empty())
+      return std::make_shared<LinuxDevice>(std::make_shared<LinuxCaptureClient>(cameras_));
     refuseLinux(error, LinuxErrorCode::kNoDevice, "The binding names no camera, so there is no %@.", kDeviceName);
     return nullptr;
   }
@@ -215,7 +216,7 @@ std::shared_ptr<LinuxCapture> makeLinuxCapture(const Binding& binding) {
   return makeLinuxCapture(binding, systemVideoKernel(), DeviceRoots());
 }
 
-std::shared_ptr<LinuxCapture> makeLinuxCapture(const Binding& binding, std::shared_ptr<VideoKernel> kernel,
+std::shared_ptr<LinuxCapture> makeLinuxCapture(const Binding& binding, std::shared_ptr<V4l2Api> kernel,
                                                DeviceRoots roots) {
   return std::make_shared<LinuxCaptureService>(
       std::make_shared<LinuxCameras>(binding, std::move(kernel), std::move(roots)));

@@ -2,8 +2,8 @@
 #pragma once
 
 #include "backends/linux/binding/binding.h"
-#include "backends/linux/video/video_kernel.h"
-#include "backends/linux/video/video_nodes.h"
+#include "backends/linux/video/v4l2_api.h"
+#include "backends/linux/video/v4l2_device_info.h"
 #include "platform/capture_service.h"
 
 #include <cstdint>
@@ -23,7 +23,7 @@ class LinuxCapture : public CaptureService {
 
 std::shared_ptr<LinuxCapture> makeLinuxCapture(const Binding& binding);
 // The same, on another system than the running one.
-std::shared_ptr<LinuxCapture> makeLinuxCapture(const Binding& binding, std::shared_ptr<VideoKernel> kernel,
+std::shared_ptr<LinuxCapture> makeLinuxCapture(const Binding& binding, std::shared_ptr<V4l2Api> kernel,
                                                DeviceRoots roots);
 
 }  // namespace quazor

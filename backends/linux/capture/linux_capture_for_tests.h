@@ -6,7 +6,7 @@
 #include "contract/message_format.h"
 #include "platform/capture_keys.h"
 #include "platform/pixel_buffer.h"
-#include "tests/support/fake_video_kernel.h"
+#include "tests/support/fake_v4l2_api.h"
 
 #include <gtest/gtest.h>
 
@@ -126,13 +126,13 @@ class FakeCameras {
     return kernel->with(
         nodes[3], [id](const FakeNode& node) { return std::ranges::find(node.controls, id, &FakeControl::id)->value; });
   }
-  void letGo() {
+  void release() {
     device.reset();
     streams.clear();
     group.reset();
   }
 
-  std::shared_ptr<FakeVideoKernel> kernel = std::make_shared<FakeVideoKernel>();
+  std::shared_ptr<FakeV4l2Api> kernel = std::make_shared<FakeV4l2Api>();
   Binding binding;
   std::vector<std::string> nodes;  // the cameras' paths
   std::shared_ptr<LinuxCapture> capture;

@@ -161,7 +161,7 @@ TEST(LinuxCaptureTest, InvalidatingStopsAndFreesAllAndRefusesEverythingAfter) {
   const auto next = fake.capture->defaultPlugIn()->device(nullptr);
   EXPECT_TRUE(next->requestControlOfStreams(*next->streams(nullptr), nullptr));
   next->invalidate(nullptr);
-  fake.letGo();
+  fake.release();
   EXPECT_TRUE(fake.kernel->isIdle());
 }
 
@@ -181,7 +181,7 @@ TEST(LinuxCaptureTest, TheLastReferenceStopsAndFreesAll) {
   ASSERT_EQ(fake.set(fake.infrared(), capture_key::InfraredLightSourceConfiguration, Fake::light(2)), "done");
   ASSERT_EQ(fake.start(0), "done");
   ASSERT_EQ(fake.start(3), "done");
-  fake.letGo();
+  fake.release();
   EXPECT_TRUE(fake.kernel->isIdle());
   EXPECT_EQ(fake.control(kStrobe), 0);
 }
@@ -200,7 +200,7 @@ TEST(LinuxCaptureTest, AHandlerThatOwnsADeviceMayGoInEveryWay) {
          EXPECT_EQ(fake.start(0), "done");
          fake.device->invalidate(nullptr);
        }},
-      {"with the last reference", [](Fake& fake) { fake.letGo(); }},
+      {"with the last reference", [](Fake& fake) { fake.release(); }},
   };
   for (const auto& row : rows) {
     Fake fake;

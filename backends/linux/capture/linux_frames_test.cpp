@@ -1,7 +1,7 @@
 // Streaming over a made-up driver: what handlers get, what is counted, how every failure ends.
 #include "backends/linux/capture/camera_frames.h"
 #include "backends/linux/capture/linux_capture_for_tests.h"
-#include "backends/linux/video/video_node.h"
+#include "backends/linux/video/v4l2_device.h"
 
 #include <cerrno>
 #include <thread>
@@ -122,7 +122,7 @@ TEST(LinuxFramesTest, ABufferThatIsKeptTakesNothingFromTheDriver) {
   fake.kernel->passTime(990ms);
   EXPECT_EQ(fake.counter(0, "SequenceGapCount"), 0);
   EXPECT_EQ(fake.stop(0), "done");
-  fake.letGo();
+  fake.release();
   EXPECT_EQ(kept.size(), 30U);
   for (PixelBuffer* buffer : kept) {
     EXPECT_EQ(buffer->attachment(capture_key::MetadataDictionary), Value(Dictionary{}));
@@ -263,11 +263,11 @@ TEST(LinuxFramesTest, WhateverFailsAtTheStartLeavesNothingBusy) {
               "1 " + std::string(row.want) + " " + fake.nodes[kInfrared] + " failed: Input/output error (EIO)");
     EXPECT_EQ(fake.kernel->guards(), 0) << row.name;
     EXPECT_EQ(fake.control(kStrobe), 0) << row.name;
-    const auto other = OpenedVideoNode::open(fake.kernel, fake.nodes[kInfrared], nullptr);
+    const auto other = V4l2Device::open(fake.kernel, fake.nodes[kInfrared], nullptr);
     EXPECT_TRUE(other->setFormat(1, 640, 360, nullptr)) << row.name << ": the next user gets EBUSY";
     EXPECT_EQ(fake.start(kInfrared), "done") << row.name;
     EXPECT_EQ(fake.stop(kInfrared), "done") << row.name;
-    fake.letGo();
+    fake.release();
   }
 }
 
@@ -296,7 +296,7 @@ TEST(LinuxFramesTest, WhatTheSystemRefusesAtTheStartLeavesNothingBusy) {
        "1 VIDIOC_REQBUFS on META failed: Invalid argument (EINVAL)"},
       {"a control of the metadata",
        [](Fake& fake) {
-         fake.letGo();
+         fake.release();
          fake.binding.cameras[kInfrared].metadata.controls = {{"Gain", "Gain"}};
          fake.open();
          fake.prepare(kInfrared);
@@ -322,7 +322,7 @@ TEST(LinuxFramesTest, WhatTheSystemRefusesAtTheStartLeavesNothingBusy) {
       want.replace(at, 4, (fake.kernel->roots().dev / "video13").string());
     }
     EXPECT_EQ(fake.start(kInfrared), want) << row.name;
-    fake.letGo();
+    fake.release();
     EXPECT_TRUE(fake.kernel->isIdle()) << row.name;
     EXPECT_EQ(fake.control(kStrobe), 0) << row.name;
   }
@@ -338,7 +338,7 @@ TEST(LinuxFramesTest, WhatFailsAtTheStopIsToldAndNothingStaysBusy) {
     EXPECT_EQ(fake.stop(0), "1 " + std::string(name) + " on " + fake.nodes[0] + " failed: Input/output error (EIO)");
     EXPECT_EQ(fake.stop(0), "7 BackFacingCamera is not running.");
     EXPECT_EQ(fake.kernel->with(fake.nodes[0], [](auto& node) { return node.mapped; }), 0);
-    fake.letGo();
+    fake.release();
   }
 }
 

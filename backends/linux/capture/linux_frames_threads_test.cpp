@@ -24,7 +24,7 @@ TEST(LinuxFramesThreadsTest, AHandlerMayReadStopAndLetGoOfEverything) {
     stopped = fake.stop(0);
     again = fake.stop(0);
     EXPECT_EQ(fake.counter(0, "StreamErrorCount"), 0);
-    fake.letGo();
+    fake.release();
     const std::lock_guard lock(mutex);
     done = true;
     changed.notify_all();
@@ -42,7 +42,7 @@ TEST(LinuxFramesThreadsTest, AHandlerMayReadStopAndLetGoOfEverything) {
 TEST(LinuxFramesThreadsTest, AHandlerMayLetGoOfAStreamThatRuns) {
   Fake fake;
   fake.prepare(0);
-  fake.handle(0, [&](PixelBuffer&, MediaTime) { fake.letGo(); });
+  fake.handle(0, [&](PixelBuffer&, MediaTime) { fake.release(); });
   ASSERT_EQ(fake.start(0), "done");
   fake.kernel->produce(fake.nodes[0]);
   for (int i = 0; i < 5000 && !fake.kernel->isIdle(); ++i) std::this_thread::sleep_for(1ms);
@@ -145,7 +145,7 @@ TEST(LinuxFramesThreadsTest, WhatIsInvalidatedWhileItIsStoppedIsFreeAfterTheStop
   EXPECT_TRUE(fake.device->invalidate(nullptr));
   gate.open();
   stopper.join();
-  fake.letGo();
+  fake.release();
   EXPECT_TRUE(fake.kernel->isIdle());
   fake.device = fake.capture->defaultPlugIn()->device(nullptr);
   fake.streams = *fake.device->streams(nullptr);
@@ -177,7 +177,7 @@ TEST(LinuxFramesThreadsTest, WhileAHandlerStopsOneThreadMayInvalidateAndAnotherT
     gate.open();
     EXPECT_TRUE(fake.device->invalidate(nullptr));
     taker.join();
-    fake.letGo();
+    fake.release();
     EXPECT_TRUE(fake.kernel->isIdle());
   }
 }
@@ -200,7 +200,7 @@ TEST(LinuxFramesThreadsTest, WhileOneThreadStopsAHandlerMayInvalidate) {
   stopper.join();
   EXPECT_TRUE(stopped == "done" || stopped == "7 The capture device has been invalidated; ask for a new one.")
       << stopped;
-  fake.letGo();
+  fake.release();
   EXPECT_TRUE(fake.kernel->isIdle());
 }
 

@@ -16,7 +16,7 @@ std::string nameOf(const GroupBinding& group) {
 
 }  // namespace
 
-LinuxGroup::LinuxGroup(std::shared_ptr<LinuxUser> user, std::size_t index,
+LinuxGroup::LinuxGroup(std::shared_ptr<LinuxCaptureClient> user, std::size_t index,
                        const std::vector<std::shared_ptr<LinuxStream>>& streams)
     : user_(std::move(user)), index_(index), name_(nameOf(state().binding)) {
   for (const std::size_t camera : state().cameras) streams_.push_back(streams[camera]);

@@ -15,7 +15,7 @@ namespace quazor {
 class LinuxGroup final : public SynchronizedStreamsGroup {
  public:
   // The group at `index`; `streams` are its user's streams of all cameras, by the camera's index.
-  LinuxGroup(std::shared_ptr<LinuxUser> user, std::size_t index,
+  LinuxGroup(std::shared_ptr<LinuxCaptureClient> user, std::size_t index,
              const std::vector<std::shared_ptr<LinuxStream>>& streams);
 
   std::string description() const override;
@@ -33,7 +33,7 @@ class LinuxGroup final : public SynchronizedStreamsGroup {
   bool setMasterConfiguration(const Value& value, DiagnosticErrorPtr* error);
   Value streamOf(std::size_t camera) const;
 
-  const std::shared_ptr<LinuxUser> user_;
+  const std::shared_ptr<LinuxCaptureClient> user_;
   const std::size_t index_;
   const std::string name_;
   std::vector<std::shared_ptr<LinuxStream>> streams_;  // in the group's order

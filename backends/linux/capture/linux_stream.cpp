@@ -15,7 +15,7 @@ std::nullopt_t unknown(std::string_view object, std::string_view key, Diagnostic
 
 }  // namespace
 
-LinuxStream::LinuxStream(std::shared_ptr<LinuxUser> user, std::size_t index)
+LinuxStream::LinuxStream(std::shared_ptr<LinuxCaptureClient> user, std::size_t index)
     : user_(std::move(user)), index_(index), port_(camera().port()) {}
 
 std::string LinuxStream::description() const { return "stream of " + port_; }

@@ -1,7 +1,7 @@
 // LinuxStream: the stream of one camera, as one user has it.
 #pragma once
 
-#include "backends/linux/capture/linux_user.h"
+#include "backends/linux/capture/linux_capture_client.h"
 #include "platform/capture_service.h"
 
 #include <cstddef>
@@ -15,7 +15,7 @@ namespace quazor {
 class LinuxStream final : public CaptureStream {
  public:
   // The stream of the camera at `index`.
-  LinuxStream(std::shared_ptr<LinuxUser> user, std::size_t index);
+  LinuxStream(std::shared_ptr<LinuxCaptureClient> user, std::size_t index);
 
   std::string description() const override;
   std::optional<Value> valueForProperty(std::string_view key, DiagnosticErrorPtr* error) override;
@@ -31,7 +31,7 @@ class LinuxStream final : public CaptureStream {
   bool set(const Value& value, std::string_view key, DiagnosticErrorPtr* error);
   bool setOutput(const Value& value, std::string_view key, DiagnosticErrorPtr* error);
 
-  const std::shared_ptr<LinuxUser> user_;
+  const std::shared_ptr<LinuxCaptureClient> user_;
   const std::size_t index_;
   const std::string port_;
 };

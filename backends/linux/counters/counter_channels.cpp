@@ -16,7 +16,7 @@ namespace quazor {
 namespace {
 
 constexpr std::string_view kNameAsKey = "{name}";
-constexpr int kMostProcessors = 65536;
+constexpr int kMaxProcessors = 65536;
 
 // Also a link that leads to itself leads nowhere.
 bool isNotThere(int number) { return number == ENOENT || number == ENOTDIR || number == ENODEV || number == ELOOP; }
@@ -25,9 +25,10 @@ bool isNotThere(int number) { return number == ENOENT || number == ENOTDIR || nu
 class Walk {
  public:
   // What is found: the file, and what the placeholders stood for. False: to stop.
-  using Found = std::function<bool(const std::string& file, const ChannelNames& names)>;
+  using ResultsReported = std::function<bool(const std::string& file, const ChannelNames& names)>;
 
-  Walk(CounterSystem& system, std::string_view path, Found found) : system_(system), found_(std::move(found)) {
+  Walk(CounterSystem& system, std::string_view path, ResultsReported found)
+      : system_(system), found_(std::move(found)) {
     for (std::size_t begin = 1; begin <= path.size();) {
       const std::size_t end = std::min(path.find('/', begin), path.size());
       components_.emplace_back(path.substr(begin, end - begin));
@@ -90,7 +91,7 @@ class Walk {
   }
 
   CounterSystem& system_;
-  const Found found_;
+  const ResultsReported found_;
   std::vector<std::string> components_;
   std::vector<NamePattern> patterns_;
   DiagnosticErrorPtr* error_ = nullptr;
@@ -219,7 +220,7 @@ std::vector<int> processorsIn(std::string_view list) {
     int last = first;
     at = afterFirst;
     if (at != end && *at == '-') at = std::from_chars(at + 1, end, last).ptr;
-    for (int one = first; one <= std::min(last, kMostProcessors); ++one) processors.push_back(one);
+    for (int one = first; one <= std::min(last, kMaxProcessors); ++one) processors.push_back(one);
     if (at != end) ++at;  // the comma, or the end of the line
   }
   return processors;

@@ -13,7 +13,7 @@
 namespace quazor {
 namespace {
 
-constexpr std::size_t kLongestFile = std::size_t{1024} * 1024;
+constexpr std::size_t kMaxFileLength = std::size_t{1024} * 1024;
 constexpr std::size_t kChunk = 4096;  // what most files of the kernel hold at the most
 
 EntryKind kindOf(unsigned char type) {
@@ -54,7 +54,7 @@ class RunningSystem final : public CounterSystem {
     content->clear();
     for (;;) {
       const std::size_t before = content->size();
-      if (before > kLongestFile) return EFBIG;
+      if (before > kMaxFileLength) return EFBIG;
       content->resize(before + kChunk);
       const ssize_t got = ::read(open.get(), content->data() + before, kChunk);
       const int failure = errno;

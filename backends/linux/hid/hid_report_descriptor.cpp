@@ -28,7 +28,7 @@ enum Item : std::uint8_t {
   kUsageMinimum = 0x18
 };
 
-constexpr std::size_t kDeepest = 64;  // of collections, and of pushes
+constexpr std::size_t kMaxDepth = 64;  // of collections, and of pushes
 
 // 6.2.2.7: what holds until it is said anew.
 struct GlobalState {
@@ -120,7 +120,7 @@ class Parser {
   }
 
   bool push() {
-    if (pushed_.size() >= kDeepest) return damaged("more is pushed than fits");
+    if (pushed_.size() >= kMaxDepth) return damaged("more is pushed than fits");
     pushed_.push_back(global_);
     return true;
   }
@@ -147,7 +147,7 @@ class Parser {
   }
 
   bool beginCollection() {
-    if (depth_ >= kDeepest) return damaged("collections are nested too deeply");
+    if (depth_ >= kMaxDepth) return damaged("collections are nested too deeply");
     if (depth_ == 0) {
       result_.topLevel.push_back(local_ ? HidUsage{local_->page.value_or(global_.usagePage), local_->usage}
                                         : HidUsage{});
@@ -165,7 +165,7 @@ class Parser {
   bool addField(Bits& reports) {
     std::uint64_t& bits = reports[global_.reportID];
     bits += static_cast<std::uint64_t>(global_.reportSize) * global_.reportCount;
-    if (bits > std::uint64_t{8} * HidReportDescriptor::kLargestReport) return damaged("a report is too long");
+    if (bits > std::uint64_t{8} * HidReportDescriptor::kMaxReport) return damaged("a report is too long");
     return endMainItem();
   }
 

@@ -20,7 +20,7 @@ struct HidUsage {
 
 struct HidReportDescriptor {
   // The largest report that Linux takes, in bytes.
-  static constexpr std::uint32_t kLargestReport = 16384;
+  static constexpr std::uint32_t kMaxReport = 16384;
 
   // One for each top-level collection, in their order; the first is the device's primary one. A collection without a
   // usage has page 0, usage 0.

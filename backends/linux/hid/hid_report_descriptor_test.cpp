@@ -106,7 +106,7 @@ TEST(HidReportDescriptorTest, FieldsOfOneReportAddUpAndBitsFillBytes) {
 TEST(HidReportDescriptorTest, TheLargestReportThatFits) {
   // 16384 times 8 bits.
   const Bytes largest = {0xA1, 0x01, 0x75, 0x08, 0x96, 0x00, 0x40, 0x81, 0x02, 0xC0};
-  EXPECT_THAT(parsed(largest).inputReports, ElementsAre(Pair(0, HidReportDescriptor::kLargestReport)));
+  EXPECT_THAT(parsed(largest).inputReports, ElementsAre(Pair(0, HidReportDescriptor::kMaxReport)));
 }
 
 TEST(HidReportDescriptorTest, DamageIsToldWithItsPlace) {

@@ -52,7 +52,7 @@ void HidrawInput::schedule(RunLoop& loop, std::string_view mode) {
   {
     const std::lock_guard lock(mutex_);
     if (find(loop, mode) != places_.end()) return;
-    if (descriptor_ != nullptr && places_.empty()) throwAwayWhatIsKept();
+    if (descriptor_ != nullptr && places_.empty()) discardPending();
     places_.push_back({place, source});
     if (descriptor_ != nullptr) watchOrSignal(places_.back());
   }
@@ -97,9 +97,9 @@ bool HidrawInput::watch(Place& place) {
 }
 
 // The kernel gives one report for each read, and drops what does not fit.
-void HidrawInput::throwAwayWhatIsKept() const {
+void HidrawInput::discardPending() const {
   std::array<std::uint8_t, 1> byte{};
-  for (std::size_t i = 0; i < kMostInARound && read(byte) > 0; ++i) {
+  for (std::size_t i = 0; i < kMaxInARound && read(byte) > 0; ++i) {
   }
 }
 
@@ -132,8 +132,8 @@ bool HidrawInput::deliver(Place& place) {
     // Now, and not afterwards: the receiver may run the loop.
     if (place.watch != nullptr) place.watch->arm();
   }
-  std::array<std::uint8_t, kLongest> buffer;
-  for (std::size_t i = 0; i < kMostInARound; ++i) {
+  std::array<std::uint8_t, kMaxLength> buffer;
+  for (std::size_t i = 0; i < kMaxInARound; ++i) {
     const std::optional<Input> input = next(place, buffer);
     if (!input) break;
     if (input->receiver == nullptr) continue;
@@ -143,7 +143,7 @@ bool HidrawInput::deliver(Place& place) {
 }
 
 // Looks at everything anew: the receiver may have changed all of it.
-std::optional<HidrawInput::Input> HidrawInput::next(Place& place, std::span<std::uint8_t, kLongest> buffer) {
+std::optional<HidrawInput::Input> HidrawInput::next(Place& place, std::span<std::uint8_t, kMaxLength> buffer) {
   const std::lock_guard lock(mutex_);
   if (!isScheduled(place) || descriptor_ == nullptr || ended_) return std::nullopt;
   if (place.watch == nullptr && !watch(place)) {

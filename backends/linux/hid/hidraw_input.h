@@ -27,9 +27,9 @@ namespace quazor {
 class HidrawInput final : public std::enable_shared_from_this<HidrawInput> {
  public:
   // What a source hands on before other sources of the loop have their turn: all that the kernel keeps.
-  static constexpr std::size_t kMostInARound = 64;
+  static constexpr std::size_t kMaxInARound = 64;
   // The kernel's largest report (HID_MAX_BUFFER_SIZE) with the byte of its ID.
-  static constexpr std::size_t kLongest = 16385;
+  static constexpr std::size_t kMaxLength = 16385;
 
   // `calls` must not be null. `device` stands in messages. `numbered` says whether the device's reports begin with
   // their ID; where they do not, a 0 is put before each.
@@ -76,11 +76,11 @@ class HidrawInput final : public std::enable_shared_from_this<HidrawInput> {
   };
 
   bool deliver(Place& place);
-  std::optional<Input> next(Place& place, std::span<std::uint8_t, kLongest> buffer);
+  std::optional<Input> next(Place& place, std::span<std::uint8_t, kMaxLength> buffer);
   DiagnosticErrorPtr takeEnd(long size, int number);
   void watchOrSignal(const Scheduled& scheduled);
   bool watch(Place& place);
-  void throwAwayWhatIsKept() const;
+  void discardPending() const;
   long read(std::span<std::uint8_t> room) const;
   std::vector<Scheduled>::const_iterator find(const RunLoop& loop, std::string_view mode) const;
   bool isScheduled(const Place& place) const;

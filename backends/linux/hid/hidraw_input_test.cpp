@@ -114,7 +114,7 @@ TEST_F(HidrawInputTest, AReportWakesALoopThatSleeps) {
 
 TEST_F(HidrawInputTest, ReportsAreHandedOnAsLongAndAsShortAsTheyCome) {
   openAndSchedule();
-  Bytes longest(HidrawInput::kLongest, 0xEE);
+  Bytes longest(HidrawInput::kMaxLength, 0xEE);
   sendReport(device_, {0x75});
   sendReport(device_, longest);
   run();
@@ -125,7 +125,7 @@ TEST_F(HidrawInputTest, ReportsWithoutAnIDGetTheIDZero) {
   make(false);
   openAndSchedule();
   sendReport(device_, {0x12, 0x34});
-  sendReport(device_, Bytes(HidrawInput::kLongest - 1, 0xEE));
+  sendReport(device_, Bytes(HidrawInput::kMaxLength - 1, 0xEE));
   run();
   EXPECT_THAT(seen_, ElementsAre("001234, 3", "00eeee, 16385"));
 }
@@ -184,15 +184,15 @@ TEST_F(HidrawInputTest, SchedulingTwiceIsSchedulingOnceAndUnschedulingWhatIsNotH
 
 TEST_F(HidrawInputTest, ARoundHasAnEnd) {
   openAndSchedule();
-  for (std::size_t i = 0; i < HidrawInput::kMostInARound + 10; ++i) send(1);
+  for (std::size_t i = 0; i < HidrawInput::kMaxInARound + 10; ++i) send(1);
   std::vector<std::size_t> counts;
   const auto observer =
       loop_.makeObserver(kRunLoopBeforeSources, true, 0, [&](RunLoopActivities) { counts.push_back(seen_.size()); });
   loop_.addObserver(observer, kRunLoopDefaultMode);
   run(5ms);
   loop_.removeObserver(observer, kRunLoopDefaultMode);
-  EXPECT_THAT(seen_, SizeIs(HidrawInput::kMostInARound + 10));
-  EXPECT_THAT(counts, ElementsAre(0, HidrawInput::kMostInARound));
+  EXPECT_THAT(seen_, SizeIs(HidrawInput::kMaxInARound + 10));
+  EXPECT_THAT(counts, ElementsAre(0, HidrawInput::kMaxInARound));
 }
 
 TEST_F(HidrawInputTest, AReceiverThatSendsWithoutEndDoesNotOutlastTheLimit) {
@@ -200,7 +200,7 @@ TEST_F(HidrawInputTest, AReceiverThatSendsWithoutEndDoesNotOutlastTheLimit) {
   onInput_ = [this] { send(1); };
   send(1);
   EXPECT_EQ(run(1ms), RunLoopResult::kTimedOut);
-  EXPECT_GE(seen_.size(), HidrawInput::kMostInARound);
+  EXPECT_GE(seen_.size(), HidrawInput::kMaxInARound);
   onInput_ = nullptr;
 }
 

@@ -34,7 +34,7 @@ class KernelCalls final : public HidrawCalls {
 };
 
 // Bits of a request's number are left for the length.
-constexpr std::size_t kLongestFeature = (std::size_t{1} << _IOC_SIZEBITS) - 1;
+constexpr std::size_t kMaxFeatureLength = (std::size_t{1} << _IOC_SIZEBITS) - 1;
 
 bool isNumber(const Value& value, std::uint16_t number) {
   return value.isNumber() && toDouble(&value) == static_cast<double>(number);
@@ -87,10 +87,10 @@ class LinuxHidDevice final : public HidDevice {
                               DiagnosticErrorPtr* error) override {
     const std::shared_ptr<const FileDescriptor> descriptor = input_->descriptor();
     if (descriptor == nullptr) return refuse(error, LinuxErrorCode::kWrongState, "is not open");
-    if (payload.empty() || payload.front() != reportID || payload.size() > kLongestFeature) {
+    if (payload.empty() || payload.front() != reportID || payload.size() > kMaxFeatureLength) {
       return refuse(error, LinuxErrorCode::kBadValue,
                     "takes feature reports that begin with their ID and have at most " +
-                        std::to_string(kLongestFeature) + " bytes");
+                        std::to_string(kMaxFeatureLength) + " bytes");
     }
     const std::chrono::nanoseconds begin = calls_->now();
     int sent = -1;

@@ -3,8 +3,8 @@
 
 #include "backends/linux/counters/counter_system.h"
 #include "backends/linux/hid/hidraw_nodes.h"
-#include "backends/linux/video/video_kernel.h"
-#include "backends/linux/video/video_nodes.h"
+#include "backends/linux/video/v4l2_api.h"
+#include "backends/linux/video/v4l2_device_info.h"
 
 #include <filesystem>
 #include <memory>
@@ -15,7 +15,7 @@ namespace quazor {
 
 // Where to look.
 struct ProbeSources {
-  std::shared_ptr<VideoKernel> kernel;
+  std::shared_ptr<V4l2Api> kernel;
   DeviceRoots devices;
   HidrawRoots hid;
   std::shared_ptr<CounterSystem> counters;

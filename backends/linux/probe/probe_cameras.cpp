@@ -18,20 +18,20 @@ using Json = nlohmann::ordered_json;
 constexpr std::array kPorts{port_type::BackFacingCamera, port_type::BackFacingTelephotoCamera,
                             port_type::BackFacingSuperWideCamera, port_type::FrontFacingCamera,
                             port_type::FrontFacingInfraredCamera};
-constexpr double kUsualRate = 30;
+constexpr double kDefaultRate = 30;
 // What is chosen of a camera that offers any size, and the most that is chosen of others.
-constexpr std::uint32_t kUsualWidth = 640;
-constexpr std::uint32_t kUsualHeight = 480;
-constexpr std::uint64_t kMostPixels = std::uint64_t{1920} * 1080;
-constexpr std::uint32_t kLargestSide = 65536;  // that a binding can name
+constexpr std::uint32_t kDefaultWidth = 640;
+constexpr std::uint32_t kDefaultHeight = 480;
+constexpr std::uint64_t kMaxPixels = std::uint64_t{1920} * 1080;
+constexpr std::uint32_t kMaxSide = 65536;  // that a binding can name
 
 bool reachesUsualRate(const FrameSize& size) {
   bool below = false;
   bool above = false;
   for (const FrameInterval& interval : size.intervals) {
     const double rate = interval.framesPerSecond();
-    if (std::abs(rate - kUsualRate) < 0.01) return true;
-    (rate < kUsualRate ? below : above) = true;
+    if (std::abs(rate - kDefaultRate) < 0.01) return true;
+    (rate < kDefaultRate ? below : above) = true;
   }
   return size.anyIntervalBetween && below && above;
 }
@@ -91,11 +91,11 @@ std::optional<std::pair<std::uint32_t, std::uint32_t>> chosenSize(const VideoNod
   std::pair<bool, std::uint64_t> best;
   if (details.formats.empty()) return chosen;
   for (const FrameSize& size : details.formats.front().sizes) {
-    const std::uint32_t width = std::clamp(kUsualWidth, size.width, std::max(size.width, size.highestWidth));
-    const std::uint32_t height = std::clamp(kUsualHeight, size.height, std::max(size.height, size.highestHeight));
-    if (std::min(width, height) == 0 || std::max(width, height) > kLargestSide) continue;
+    const std::uint32_t width = std::clamp(kDefaultWidth, size.width, std::max(size.width, size.highestWidth));
+    const std::uint32_t height = std::clamp(kDefaultHeight, size.height, std::max(size.height, size.highestHeight));
+    if (std::min(width, height) == 0 || std::max(width, height) > kMaxSide) continue;
     const std::uint64_t pixels = std::uint64_t{width} * height;
-    const std::pair<bool, std::uint64_t> worth{reachesUsualRate(size), pixels <= kMostPixels ? pixels : 1};
+    const std::pair<bool, std::uint64_t> worth{reachesUsualRate(size), pixels <= kMaxPixels ? pixels : 1};
     if (chosen && worth <= best) continue;
     best = worth;
     chosen = {width, height};
@@ -103,20 +103,20 @@ std::optional<std::pair<std::uint32_t, std::uint32_t>> chosenSize(const VideoNod
   return chosen;
 }
 
-bool isSameMatch(const VideoNode& a, const VideoNode& b) {
+bool isSameMatch(const V4l2DeviceInfo& a, const V4l2DeviceInfo& b) {
   return a.driver == b.driver && a.card == b.card && a.busInfo == b.busInfo;
 }
 
 class CameraProbe {
  public:
-  CameraProbe(const std::shared_ptr<VideoKernel>& kernel, const DeviceRoots& roots, std::vector<std::string>* lines)
+  CameraProbe(const std::shared_ptr<V4l2Api>& kernel, const DeviceRoots& roots, std::vector<std::string>* lines)
       : kernel_(kernel), nodes_(videoNodes(kernel, roots)), lines_(lines) {}
 
   Json run() {
     if (nodes_.empty()) {
       tell("  none: no driver offers a video node (/dev/video*). Is the camera connected, and its driver loaded?");
     }
-    for (const VideoNode& node : nodes_) {
+    for (const V4l2DeviceInfo& node : nodes_) {
       tell("  " + textOf(node));
       if (node.problem != nullptr) {
         tellProblem(*node.problem);
@@ -141,11 +141,11 @@ class CameraProbe {
     }
   }
 
-  void probeCamera(const VideoNode& node) {
+  void probeCamera(const V4l2DeviceInfo& node) {
     DiagnosticErrorPtr error;
     const std::optional<VideoNodeDetails> details = detailsOf(kernel_, node, &error);
     if (!details) return tellProblem(*error);
-    const auto isLikeIt = [&node](const VideoNode& other) {
+    const auto isLikeIt = [&node](const V4l2DeviceInfo& other) {
       return other.kind == VideoNodeKind::kCamera && other.problem == nullptr && isSameMatch(other, node);
     };
     const auto size = chosenSize(*details);
@@ -167,7 +167,7 @@ class CameraProbe {
     tellControls(details->controls, lines_);
   }
 
-  void bind(const VideoNode& node, std::pair<std::uint32_t, std::uint32_t> size) {
+  void bind(const V4l2DeviceInfo& node, std::pair<std::uint32_t, std::uint32_t> size) {
     const std::string port(kPorts.at(cameras_.size()));
     tell("    fits: " + port + " in the binding below; which one it really is, you must say");
     Json match = Json::object();
@@ -177,8 +177,8 @@ class CameraProbe {
     cameras_[port] = {{"node", std::move(match)}, {"size", {{"width", size.first}, {"height", size.second}}}};
   }
 
-  void tellMetadata(const VideoNode& node) const {
-    for (const VideoNode& camera : nodes_) {
+  void tellMetadata(const V4l2DeviceInfo& node) const {
+    for (const V4l2DeviceInfo& camera : nodes_) {
       if (camera.kind != VideoNodeKind::kCamera || camera.busInfo != node.busInfo || camera.problem != nullptr)
         continue;
       return tell("    metadata of " + camera.path.string() +
@@ -188,16 +188,15 @@ class CameraProbe {
     tell("    metadata of no camera that is on the same bus");
   }
 
-  const std::shared_ptr<VideoKernel>& kernel_;
-  const std::vector<VideoNode> nodes_;
+  const std::shared_ptr<V4l2Api>& kernel_;
+  const std::vector<V4l2DeviceInfo> nodes_;
   std::vector<std::string>* const lines_;
   Json cameras_ = Json::object();
 };
 
 }  // namespace
 
-Json probeCameras(const std::shared_ptr<VideoKernel>& kernel, const DeviceRoots& roots,
-                  std::vector<std::string>* lines) {
+Json probeCameras(const std::shared_ptr<V4l2Api>& kernel, const DeviceRoots& roots, std::vector<std::string>* lines) {
   return CameraProbe(kernel, roots, lines).run();
 }
 

@@ -3,7 +3,7 @@
 #include "backends/linux/binding/binding.h"
 #include "backends/linux/counters/counter_system_for_tests.h"
 #include "backends/linux/hid/hidraw_for_tests.h"
-#include "tests/support/fake_video_kernel.h"
+#include "tests/support/fake_v4l2_api.h"
 
 #include <gmock/gmock.h>
 #include <gtest/gtest.h>
@@ -62,7 +62,7 @@ class ProbeTest : public ::testing::Test {
   }
 
   const fs::path folder_;
-  const std::shared_ptr<FakeVideoKernel> kernel_ = std::make_shared<FakeVideoKernel>();
+  const std::shared_ptr<FakeV4l2Api> kernel_ = std::make_shared<FakeV4l2Api>();
   const std::shared_ptr<FakeCounters> counters_ = std::make_shared<FakeCounters>();
   HidrawRoots hid_{folder_ / "no sysfs", folder_};
   Binding binding_;  // what was suggested last

@@ -59,7 +59,7 @@ class DescriptorWaiter final : public RunLoopWaiter {
   }
 
   void wait(std::chrono::nanoseconds deadline, const std::function<bool()>& ready) override {
-    if (watch_.lookOut(
+    if (watch_.spin(
             ready, [this] { return now(); }, deadline))
       return;
     for (;;) {

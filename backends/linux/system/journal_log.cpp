@@ -17,7 +17,7 @@
 namespace quazor {
 namespace {
 
-constexpr timeval kLongestWait{0, 100'000};
+constexpr timeval kMaxWait{0, 100'000};
 
 // A value with line breaks carries its length, as 64 bits, little-endian; any other ends at the line's end.
 void appendField(std::string& fields, std::string_view name, std::string_view value) {
@@ -46,7 +46,7 @@ std::string fieldsOf(LogLevel level, std::string_view subsystem, std::string_vie
 
 FileDescriptor openSocket() {
   FileDescriptor made(::socket(AF_UNIX, SOCK_DGRAM | SOCK_CLOEXEC, 0));
-  ::setsockopt(made.get(), SOL_SOCKET, SO_SNDTIMEO, &kLongestWait, sizeof kLongestWait);
+  ::setsockopt(made.get(), SOL_SOCKET, SO_SNDTIMEO, &kMaxWait, sizeof kMaxWait);
   return made;
 }
 

@@ -1,7 +1,7 @@
 // A process beside ours that puts the light out when ours ends.
 #pragma once
 
-#include "backends/linux/video/video_kernel.h"
+#include "backends/linux/video/v4l2_api.h"
 
 #include <cstddef>
 #include <memory>

@@ -71,7 +71,7 @@ struct CaptureHardware {
   // Throws std::invalid_argument when a camera has no format or a group names a camera that there is not.
   CaptureHardware(const Scenario& scenario, std::shared_ptr<Clock> clock, std::shared_ptr<Concurrency> concurrency);
 
-  const CaptureDeviceTraits device;
+  const CaptureDeviceConfig device;
   const std::shared_ptr<Clock> clock;
   const std::shared_ptr<Concurrency> concurrency;
   const std::shared_ptr<PixelBufferPool> pool;

@@ -28,8 +28,8 @@ MediaTime mediaTime(std::chrono::nanoseconds sinceStart) {
 
 std::chrono::nanoseconds frameTime(MicroFrameRate rate, std::uint64_t frame) {
   const Wide time = ((static_cast<Wide>(frame) + 1) * kFrame + static_cast<Wide>(rate) - 1) / static_cast<Wide>(rate);
-  constexpr Wide kHighest = std::numeric_limits<std::int64_t>::max();
-  return std::chrono::nanoseconds(static_cast<std::int64_t>(std::min(time, kHighest)));
+  constexpr Wide kMaximum = std::numeric_limits<std::int64_t>::max();
+  return std::chrono::nanoseconds(static_cast<std::int64_t>(std::min(time, kMaximum)));
 }
 
 class FrameDelivery::Entry {
@@ -139,7 +139,7 @@ void FrameDelivery::close() {
 }
 
 void FrameDelivery::finish() {
-  const DeliveryTraits& traits = source_.camera.delivery;
+  const DeliveryConfig& traits = source_.camera.delivery;
   if (traits.stopWaitsForHandlers) {
     std::unique_lock lock(mutex_);
     quiet_.wait(lock, [this] {

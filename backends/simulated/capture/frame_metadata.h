@@ -1,7 +1,7 @@
 // The metadata that the simulated capture service attaches to frames.
 #pragma once
 
-#include "backends/simulated/scenario/frame_traits.h"
+#include "backends/simulated/scenario/frame_config.h"
 #include "contract/value.h"
 
 #include <optional>

@@ -16,7 +16,7 @@ namespace {
 
 using Keys = std::span<const std::string_view>;
 
-constexpr std::uint64_t kHighestLightSetting = 255;
+constexpr std::uint64_t kMaxLightSetting = 255;
 constexpr std::array kLightSettings{capture_key::Mode, capture_key::StructuredLightPattern,
                                     capture_key::StructuredLightCurrent};
 constexpr std::array kOutputs{capture_key::PrimaryScaler};
@@ -57,7 +57,7 @@ bool checkLightSource(std::string_view object, const Value& value, DiagnosticErr
     if (entry == nullptr) {
       return refuse(error, CaptureErrorCode::kOutOfRange, "%@: %@ must have %@.", object, kKey, setting);
     }
-    if (!checkIndex(object, setting, *entry, kHighestLightSetting, error)) return false;
+    if (!checkIndex(object, setting, *entry, kMaxLightSetting, error)) return false;
   }
   return true;
 }

@@ -5,7 +5,7 @@
 #pragma once
 
 #include "backends/simulated/calls/capture_error.h"
-#include "backends/simulated/scenario/capture_catalogue.h"
+#include "backends/simulated/scenario/property_table.h"
 #include "contract/value.h"
 
 #include <cstdint>

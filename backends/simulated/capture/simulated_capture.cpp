@@ -21,7 +21,7 @@ constexpr std::string_view kDeviceName = "capture device";
 
 }  // namespace
 
-SimulatedDevice::SimulatedDevice(std::shared_ptr<CaptureUser> user) : user_(std::move(user)) {
+SimulatedDevice::SimulatedDevice(std::shared_ptr<SimulatedCaptureClient> user) : user_(std::move(user)) {
   const CaptureHardware& hardware = user_->hardware();
   for (std::size_t i = 0; i < hardware.cameras.size(); ++i) {
     streams_.push_back(std::make_shared<SimulatedStream>(user_, i));
@@ -187,7 +187,7 @@ std::shared_ptr<CaptureDevice> SimulatedPlugIn::device(DiagnosticErrorPtr* error
           refuse(error, CaptureErrorCode::kNoDevice, "The phone has no %@.", kDeviceName);
           return nullptr;
         }
-        return std::make_shared<SimulatedDevice>(std::make_shared<CaptureUser>(hardware_, calls_));
+        return std::make_shared<SimulatedDevice>(std::make_shared<SimulatedCaptureClient>(hardware_, calls_));
       });
 }
 

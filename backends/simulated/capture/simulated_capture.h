@@ -14,7 +14,7 @@ namespace quazor {
 // them. What the user controls is free again when the device, its groups and its streams are gone.
 class SimulatedDevice final : public CaptureDevice {
  public:
-  explicit SimulatedDevice(std::shared_ptr<CaptureUser> user);
+  explicit SimulatedDevice(std::shared_ptr<SimulatedCaptureClient> user);
 
   std::string description() const override;
   std::optional<CaptureStreams> streams(DiagnosticErrorPtr* error) override;
@@ -33,7 +33,7 @@ class SimulatedDevice final : public CaptureDevice {
   bool readGroups(const Value& value, std::vector<std::size_t>* groups, DiagnosticErrorPtr* error) const;
   bool checkGroup(const GroupState& group, DiagnosticErrorPtr* error) const;
 
-  const std::shared_ptr<CaptureUser> user_;
+  const std::shared_ptr<SimulatedCaptureClient> user_;
   std::vector<std::shared_ptr<SimulatedStream>> streams_;  // by the camera's index
   std::vector<std::shared_ptr<SimulatedGroup>> groups_;    // by the group's index
 };

@@ -269,7 +269,7 @@ TEST_F(SimulatedCaptureTest, ANewConfigurationIsANewSession) {
   EXPECT_EQ(user_.status(), "(null)");
 }
 
-TEST(SimulatedCaptureTraits, TheStatusFollowsTheCamerasOfTheScenario) {
+TEST(SimulatedCaptureConfig, TheStatusFollowsTheCamerasOfTheScenario) {
   Scenario scenario = smallScenario();
   scenario.cameras[0].actualFrameRate = 29.5;
   scenario.cameras[1].inSessionStatus = false;
@@ -280,7 +280,7 @@ TEST(SimulatedCaptureTraits, TheStatusFollowsTheCamerasOfTheScenario) {
   EXPECT_EQ(user.status(), "{BackFacingCamera = {Offset = 0; FrameCount = 59}}");
 }
 
-TEST(SimulatedCaptureTraits, APlugInThatDoesNotLoadIsNull) {
+TEST(SimulatedCaptureConfig, APlugInThatDoesNotLoadIsNull) {
   Scenario scenario = smallScenario();
   scenario.device.plugInLoads = false;
   const SimulatedPhone phone(scenario, PhoneTime::kVirtual, 1);
@@ -288,7 +288,7 @@ TEST(SimulatedCaptureTraits, APlugInThatDoesNotLoadIsNull) {
   EXPECT_EQ(phone.platform().capture->defaultPlugIn(), nullptr);
 }
 
-TEST(SimulatedCaptureTraits, APhoneWithoutADeviceSaysSo) {
+TEST(SimulatedCaptureConfig, APhoneWithoutADeviceSaysSo) {
   Scenario scenario = smallScenario();
   scenario.device.present = false;
   const SimulatedPhone phone(scenario, PhoneTime::kVirtual, 1);

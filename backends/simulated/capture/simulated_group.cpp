@@ -6,7 +6,7 @@
 
 namespace quazor {
 
-SimulatedGroup::SimulatedGroup(std::shared_ptr<const CaptureUser> user, std::size_t index,
+SimulatedGroup::SimulatedGroup(std::shared_ptr<const SimulatedCaptureClient> user, std::size_t index,
                                const std::vector<std::shared_ptr<SimulatedStream>>& streams)
     : user_(std::move(user)), index_(index), id_(state().id) {
   for (const std::size_t camera : state().cameras) streams_.push_back(streams[camera]);

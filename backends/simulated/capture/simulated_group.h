@@ -15,7 +15,7 @@ namespace quazor {
 class SimulatedGroup final : public SynchronizedStreamsGroup {
  public:
   // The group at `index`; `streams` are its user's streams of all cameras, by the camera's index.
-  SimulatedGroup(std::shared_ptr<const CaptureUser> user, std::size_t index,
+  SimulatedGroup(std::shared_ptr<const SimulatedCaptureClient> user, std::size_t index,
                  const std::vector<std::shared_ptr<SimulatedStream>>& streams);
 
   std::string description() const override;
@@ -35,7 +35,7 @@ class SimulatedGroup final : public SynchronizedStreamsGroup {
   bool setMasterConfiguration(const Value& value, DiagnosticErrorPtr* error);
   bool checkSlaves(const Value& value, DiagnosticErrorPtr* error) const;
 
-  const std::shared_ptr<const CaptureUser> user_;
+  const std::shared_ptr<const SimulatedCaptureClient> user_;
   const std::size_t index_;
   const std::string id_;
   std::vector<std::shared_ptr<SimulatedStream>> streams_;  // in the group's order

@@ -151,7 +151,7 @@ TEST_F(SimulatedGroupTest, ARunningStreamHoldsOffSettings) {
             refusal(Code::kWrongState, "back: MasterConfiguration cannot be set while tele is running."));
 }
 
-TEST(SimulatedGroupTraits, AGroupWithoutTheMasterConfigurationSaysSoAndRefusesIt) {
+TEST(SimulatedGroupConfig, AGroupWithoutTheMasterConfigurationSaysSoAndRefusesIt) {
   Scenario scenario = smallScenario();
   scenario.groups[0].masterConfiguration = false;
   const SimulatedPhone phone(scenario, PhoneTime::kVirtual, 1);

@@ -6,11 +6,13 @@
 namespace quazor {
 namespace {
 
-const Camera& cameraAt(const CaptureUser& user, std::size_t index) { return user.hardware().cameras[index].camera; }
+const Camera& cameraAt(const SimulatedCaptureClient& user, std::size_t index) {
+  return user.hardware().cameras[index].camera;
+}
 
 }  // namespace
 
-SimulatedStream::SimulatedStream(std::shared_ptr<const CaptureUser> user, std::size_t index)
+SimulatedStream::SimulatedStream(std::shared_ptr<const SimulatedCaptureClient> user, std::size_t index)
     : user_(std::move(user)), index_(index), id_(cameraAt(*user_, index).id), port_(cameraAt(*user_, index).port) {}
 
 std::string SimulatedStream::description() const { return "stream " + id_ + " (" + port_ + ")"; }

@@ -1,7 +1,7 @@
 // SimulatedStream: the stream of one camera, as one user has it.
 #pragma once
 
-#include "backends/simulated/capture/capture_user.h"
+#include "backends/simulated/capture/simulated_capture_client.h"
 #include "platform/capture_service.h"
 
 #include <cstddef>
@@ -15,7 +15,7 @@ namespace quazor {
 class SimulatedStream final : public CaptureStream {
  public:
   // The stream of the camera at `index`.
-  SimulatedStream(std::shared_ptr<const CaptureUser> user, std::size_t index);
+  SimulatedStream(std::shared_ptr<const SimulatedCaptureClient> user, std::size_t index);
 
   std::string description() const override;
   std::optional<Value> valueForProperty(std::string_view key, DiagnosticErrorPtr* error) override;
@@ -32,7 +32,7 @@ class SimulatedStream final : public CaptureStream {
   bool set(const Value& value, std::string_view key, DiagnosticErrorPtr* error);
   bool checkStart(const CameraState& camera, DiagnosticErrorPtr* error) const;
 
-  const std::shared_ptr<const CaptureUser> user_;
+  const std::shared_ptr<const SimulatedCaptureClient> user_;
   const std::size_t index_;
   const std::string id_;
   const std::string port_;

@@ -226,7 +226,7 @@ TEST_F(SimulatedStreamTest, ARateThatTheFormatDoesNotReachIsJudgedWhenTheStreamS
             refusal(Code::kWrongState, "wide cannot start: MaximumFrameRate is 60, and format 0 has at most 30."));
 }
 
-TEST(SimulatedStreamTraits, ACameraWithoutMultipleOutputsRefusesToEnableThem) {
+TEST(SimulatedStreamConfig, ACameraWithoutMultipleOutputsRefusesToEnableThem) {
   Scenario scenario = smallScenario();
   scenario.cameras[0].multipleOutputs = false;
   const SimulatedPhone phone(scenario, PhoneTime::kVirtual, 1);
@@ -241,7 +241,7 @@ TEST(SimulatedStreamTraits, ACameraWithoutMultipleOutputsRefusesToEnableThem) {
   EXPECT_EQ(set(false), "done");
 }
 
-TEST(SimulatedStreamTraits, CountersThatCannotBeReadAreRefused) {
+TEST(SimulatedStreamConfig, CountersThatCannotBeReadAreRefused) {
   Scenario scenario = smallScenario();
   scenario.cameras[0].errorCounters.reset();
   const SimulatedPhone phone(scenario, PhoneTime::kVirtual, 1);

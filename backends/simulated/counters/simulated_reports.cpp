@@ -36,14 +36,14 @@ class SimulatedReportFacility::Channels {
     }
   };
 
-  Channels(const std::vector<ReportChannelTraits>& traits, std::shared_ptr<CaptureHardware> phone,
+  Channels(const std::vector<ReportChannelConfig>& traits, std::shared_ptr<CaptureHardware> phone,
            std::shared_ptr<CallInterceptor> interceptor)
       : calls(std::move(interceptor)), hardware_(std::move(phone)) {
     // The descriptions of all channels lie in one place, which every pointer to one of them keeps.
     const auto descriptions = std::make_shared<std::vector<ReportChannelDescription>>();
     descriptions->reserve(traits.size());
     all.reserve(traits.size());
-    for (const ReportChannelTraits& channel : traits) {
+    for (const ReportChannelConfig& channel : traits) {
       descriptions->push_back({channel.group, channel.subGroup, channel.name});
       all.push_back({std::shared_ptr<const ReportChannelDescription>(descriptions, &descriptions->back()),
                      channel.count, channel.growth, channel.steps});
@@ -141,7 +141,7 @@ class SimulatedReportFacility::Set final : public ReportChannelSet {
   const std::shared_ptr<const std::vector<std::size_t>> chosen_;
 };
 
-SimulatedReportFacility::SimulatedReportFacility(const std::vector<ReportChannelTraits>& channels,
+SimulatedReportFacility::SimulatedReportFacility(const std::vector<ReportChannelConfig>& channels,
                                                  std::shared_ptr<CaptureHardware> hardware,
                                                  std::shared_ptr<CallInterceptor> calls)
     : channels_(std::make_shared<const Channels>(channels, std::move(hardware), std::move(calls))) {}

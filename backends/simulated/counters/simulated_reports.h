@@ -3,7 +3,7 @@
 
 #include "backends/simulated/calls/call_interceptor.h"
 #include "backends/simulated/capture/capture_hardware.h"
-#include "backends/simulated/scenario/report_traits.h"
+#include "backends/simulated/scenario/report_config.h"
 #include "platform/report_facility.h"
 
 #include <cstdint>
@@ -19,7 +19,7 @@ namespace quazor {
 // Thread: any.
 class SimulatedReportFacility final : public ReportFacility {
  public:
-  SimulatedReportFacility(const std::vector<ReportChannelTraits>& channels, std::shared_ptr<CaptureHardware> hardware,
+  SimulatedReportFacility(const std::vector<ReportChannelConfig>& channels, std::shared_ptr<CaptureHardware> hardware,
                           std::shared_ptr<CallInterceptor> calls);
 
   std::shared_ptr<const ReportChannelSet> reportWithOnlySimpleChannels(DiagnosticErrorPtr* error) override;

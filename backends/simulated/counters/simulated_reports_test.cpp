@@ -19,9 +19,9 @@ using namespace std::chrono_literals;
 using ::testing::ElementsAre;
 using ::testing::IsEmpty;
 
-ReportChannelTraits channel(const char* group, const char* subGroup, const char* name,
+ReportChannelConfig channel(const char* group, const char* subGroup, const char* name,
                             std::optional<std::uint64_t> count) {
-  ReportChannelTraits traits;
+  ReportChannelConfig traits;
   traits.group = group;
   traits.subGroup = subGroup;
   traits.name = name;
@@ -34,7 +34,7 @@ class SimulatedReportsTest : public ::testing::Test {
   using Set = std::shared_ptr<const ReportChannelSet>;
   using Snapshot = std::shared_ptr<const ReportSnapshot>;
 
-  void make(std::vector<ReportChannelTraits> channels) {
+  void make(std::vector<ReportChannelConfig> channels) {
     Scenario scenario = smallScenario();
     scenario.reports = std::move(channels);
     phone_.emplace(scenario, PhoneTime::kVirtual, 1);
@@ -93,9 +93,9 @@ TEST_F(SimulatedReportsTest, FilteringMakesANewSetAndLeavesTheOldOne) {
 }
 
 TEST_F(SimulatedReportsTest, CountsGrowWhileAnyStreamRuns) {
-  ReportChannelTraits growing = channel("A", "s", "growing", 5);
+  ReportChannelConfig growing = channel("A", "s", "growing", 5);
   growing.growth = 10;
-  ReportChannelTraits stepping = channel("A", "s", "stepping", 0);
+  ReportChannelConfig stepping = channel("A", "s", "stepping", 0);
   stepping.steps = {{250ms, 1}, {1s, 7}};
   make({growing, stepping, channel("A", "s", "still", 2)});
   const Set set = simple();
@@ -118,9 +118,9 @@ TEST_F(SimulatedReportsTest, CountsGrowWhileAnyStreamRuns) {
 }
 
 TEST_F(SimulatedReportsTest, ADeltaIsTheLaterCountMinusTheBaselines) {
-  ReportChannelTraits growing = channel("A", "s", "growing", 5);
+  ReportChannelConfig growing = channel("A", "s", "growing", 5);
   growing.growth = 10;
-  ReportChannelTraits wrapping = channel("A", "s", "wrapping", std::numeric_limits<std::uint64_t>::max());
+  ReportChannelConfig wrapping = channel("A", "s", "wrapping", std::numeric_limits<std::uint64_t>::max());
   wrapping.growth = 2;
   make({growing, channel("A", "s", "still", 9), channel("A", "s", "without", std::nullopt), wrapping});
   const Set set = simple();

@@ -15,7 +15,7 @@ std::string nothing() { return {}; }
 
 class SimulatedFramebufferService::Registry final : public RegistryService {
  public:
-  Registry(std::shared_ptr<const DisplayTraits> display, std::shared_ptr<CallInterceptor> calls)
+  Registry(std::shared_ptr<const DisplayConfig> display, std::shared_ptr<CallInterceptor> calls)
       : display_(std::move(display)), calls_(std::move(calls)) {}
 
   std::string description() const override { return "registry entry of the main display's framebuffer"; }
@@ -30,13 +30,13 @@ class SimulatedFramebufferService::Registry final : public RegistryService {
   }
 
  private:
-  const std::shared_ptr<const DisplayTraits> display_;
+  const std::shared_ptr<const DisplayConfig> display_;
   const std::shared_ptr<CallInterceptor> calls_;
 };
 
 class SimulatedFramebufferService::MainDisplay final : public Display {
  public:
-  MainDisplay(std::shared_ptr<const DisplayTraits> display, std::shared_ptr<CallInterceptor> calls)
+  MainDisplay(std::shared_ptr<const DisplayConfig> display, std::shared_ptr<CallInterceptor> calls)
       : display_(std::move(display)), calls_(std::move(calls)) {}
 
   std::string description() const override { return "main display"; }
@@ -50,13 +50,13 @@ class SimulatedFramebufferService::MainDisplay final : public Display {
   }
 
  private:
-  const std::shared_ptr<const DisplayTraits> display_;
+  const std::shared_ptr<const DisplayConfig> display_;
   const std::shared_ptr<CallInterceptor> calls_;
 };
 
-SimulatedFramebufferService::SimulatedFramebufferService(const DisplayTraits& display,
+SimulatedFramebufferService::SimulatedFramebufferService(const DisplayConfig& display,
                                                          std::shared_ptr<CallInterceptor> calls)
-    : display_(std::make_shared<const DisplayTraits>(display)), calls_(std::move(calls)) {}
+    : display_(std::make_shared<const DisplayConfig>(display)), calls_(std::move(calls)) {}
 
 std::shared_ptr<Display> SimulatedFramebufferService::mainDisplay() {
   return calls_->perform({sensor_operation::kMainDisplay, {}, {}}, nullptr, nothing, [&]() -> std::shared_ptr<Display> {

@@ -2,7 +2,7 @@
 #pragma once
 
 #include "backends/simulated/calls/call_interceptor.h"
-#include "backends/simulated/scenario/display_traits.h"
+#include "backends/simulated/scenario/display_config.h"
 #include "platform/framebuffer_service.h"
 
 #include <memory>
@@ -12,7 +12,7 @@ namespace quazor {
 // The scenario's main display, which never changes. Thread: any.
 class SimulatedFramebufferService final : public FramebufferService {
  public:
-  SimulatedFramebufferService(const DisplayTraits& display, std::shared_ptr<CallInterceptor> calls);
+  SimulatedFramebufferService(const DisplayConfig& display, std::shared_ptr<CallInterceptor> calls);
 
   std::shared_ptr<Display> mainDisplay() override;
 
@@ -20,7 +20,7 @@ class SimulatedFramebufferService final : public FramebufferService {
   class MainDisplay;
   class Registry;
 
-  const std::shared_ptr<const DisplayTraits> display_;
+  const std::shared_ptr<const DisplayConfig> display_;
   const std::shared_ptr<CallInterceptor> calls_;
 };
 

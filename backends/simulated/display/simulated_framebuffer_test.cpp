@@ -17,7 +17,7 @@ using ::testing::ElementsAre;
 
 class SimulatedFramebufferTest : public ::testing::Test {
  protected:
-  void make(const DisplayTraits& display) {
+  void make(const DisplayConfig& display) {
     Scenario scenario = sensorScenario({});
     scenario.display = display;
     phone_.emplace(scenario, PhoneTime::kVirtual, 1);
@@ -28,7 +28,7 @@ class SimulatedFramebufferTest : public ::testing::Test {
 };
 
 TEST_F(SimulatedFramebufferTest, PropertiesAreReadThroughTheDisplay) {
-  DisplayTraits traits;
+  DisplayConfig traits;
   traits.properties = {{"Power", Dictionary{{"Panel", 1}}}, {"Name", "main"}};
   make(traits);
   const std::shared_ptr<RegistryService> service = display()->registryService();
@@ -40,7 +40,7 @@ TEST_F(SimulatedFramebufferTest, PropertiesAreReadThroughTheDisplay) {
 }
 
 TEST_F(SimulatedFramebufferTest, WhatIsMissingIsNull) {
-  DisplayTraits traits;
+  DisplayConfig traits;
   traits.registryService = false;
   make(traits);
   EXPECT_EQ(display()->registryService(), nullptr);
@@ -50,7 +50,7 @@ TEST_F(SimulatedFramebufferTest, WhatIsMissingIsNull) {
 }
 
 TEST_F(SimulatedFramebufferTest, WhatWasAnsweredOutlivesThePhone) {
-  DisplayTraits traits;
+  DisplayConfig traits;
   traits.properties = {{"Name", "main"}};
   make(traits);
   const std::shared_ptr<RegistryService> service = display()->registryService();
@@ -59,7 +59,7 @@ TEST_F(SimulatedFramebufferTest, WhatWasAnsweredOutlivesThePhone) {
 }
 
 TEST_F(SimulatedFramebufferTest, FaultsAndObserversReachEveryOperation) {
-  DisplayTraits traits;
+  DisplayConfig traits;
   traits.properties = {{"Name", "main"}, {"Power", 1}};
   make(traits);
   std::vector<std::string> calls;

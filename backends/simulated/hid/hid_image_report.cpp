@@ -23,9 +23,9 @@ void write32(Bytes& bytes, std::size_t at, std::uint32_t value) {
 }
 
 std::int32_t sampleOf(double value) {
-  constexpr double kLowest = std::numeric_limits<std::int32_t>::min();
-  constexpr double kHighest = std::numeric_limits<std::int32_t>::max();
-  return static_cast<std::int32_t>(std::clamp(std::round(value), kLowest, kHighest));
+  constexpr double kMinimum = std::numeric_limits<std::int32_t>::min();
+  constexpr double kMaximum = std::numeric_limits<std::int32_t>::max();
+  return static_cast<std::int32_t>(std::clamp(std::round(value), kMinimum, kMaximum));
 }
 
 void writeBlocks(Bytes& bytes, const HidImages& images, std::uint64_t number) {

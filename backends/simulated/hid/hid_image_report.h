@@ -1,7 +1,7 @@
 // The image reports of the simulated sensors, byte by byte.
 #pragma once
 
-#include "backends/simulated/scenario/hid_traits.h"
+#include "backends/simulated/scenario/hid_config.h"
 #include "contract/value.h"
 
 #include <chrono>

@@ -44,7 +44,8 @@ class HidInboxTest : public ::testing::Test {
   void unschedule() { inbox_->unschedule(*loop_, kRunLoopDefaultMode); }
   RunLoopResult run(std::string_view mode = kRunLoopDefaultMode) { return loop_->runInMode(mode, 0ns, false); }
 
-  std::shared_ptr<VirtualScheduler> scheduler_ = std::make_shared<VirtualScheduler>(std::make_shared<SeededChooser>(1));
+  std::shared_ptr<VirtualScheduler> scheduler_ =
+      std::make_shared<VirtualScheduler>(std::make_shared<RandomStrategy>(1));
   VirtualRunLoops loops_{scheduler_};
   RunLoop* loop_ = loops_.currentRunLoop();
   std::shared_ptr<HidInbox> inbox_ = std::make_shared<HidInbox>();

@@ -16,7 +16,7 @@ bool isNumber(const Value& value, std::uint16_t number) {
 
 }  // namespace
 
-HidSensor::HidSensor(HidDeviceTraits traits, std::shared_ptr<Clock> clock, Concurrency& concurrency)
+HidSensor::HidSensor(HidDeviceConfig traits, std::shared_ptr<Clock> clock, Concurrency& concurrency)
     : traits_(std::move(traits)),
       clock_(std::move(clock)),
       queue_(concurrency.makeSerialQueue("SimulatedHid." + traits_.name, QualityOfService::kUserInteractive)) {

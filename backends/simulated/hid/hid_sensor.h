@@ -2,7 +2,7 @@
 #pragma once
 
 #include "backends/simulated/hid/hid_inbox.h"
-#include "backends/simulated/scenario/hid_traits.h"
+#include "backends/simulated/scenario/hid_config.h"
 #include "contract/diagnostic_error.h"
 #include "contract/value.h"
 #include "platform/clock.h"
@@ -25,11 +25,11 @@ namespace quazor {
 // Thread: any. Reports are made on a queue of its own.
 class HidSensor final : public std::enable_shared_from_this<HidSensor> {
  public:
-  HidSensor(HidDeviceTraits traits, std::shared_ptr<Clock> clock, Concurrency& concurrency);
+  HidSensor(HidDeviceConfig traits, std::shared_ptr<Clock> clock, Concurrency& concurrency);
   HidSensor(const HidSensor&) = delete;
   HidSensor& operator=(const HidSensor&) = delete;
 
-  const HidDeviceTraits& traits() const { return traits_; }
+  const HidDeviceConfig& traits() const { return traits_; }
   // Whether it has all entries of a matching dictionary, and is not gone.
   bool matches(const Dictionary& wanted) const;
 
@@ -48,7 +48,7 @@ class HidSensor final : public std::enable_shared_from_this<HidSensor> {
   void sendNext(std::uint64_t stretch);
   HidInput makeInput(std::uint64_t number);
 
-  const HidDeviceTraits traits_;
+  const HidDeviceConfig traits_;
   const std::shared_ptr<Clock> clock_;
   const std::shared_ptr<SerialQueue> queue_;
 

@@ -23,13 +23,13 @@ class HidSensorTest : public ::testing::Test {
  protected:
   template <class Change>
   void make(Change&& change) {
-    HidDeviceTraits sensor = testSensor();
+    HidDeviceConfig sensor = testSensor();
     change(sensor);
     phone_.emplace(sensorScenario({sensor}), PhoneTime::kVirtual, 1);
     user_.emplace(phone_->platform());
   }
   void make() {
-    make([](HidDeviceTraits&) {});
+    make([](HidDeviceConfig&) {});
   }
   std::string setting(std::uint8_t id, std::vector<std::uint8_t> payload) {
     DiagnosticErrorPtr error;
@@ -55,7 +55,7 @@ TEST_F(HidSensorTest, ImagesComeAtTheRate) {
 }
 
 TEST_F(HidSensorTest, RatesDoNotDrift) {
-  make([](HidDeviceTraits& sensor) { sensor.rate = 60; });
+  make([](HidDeviceConfig& sensor) { sensor.rate = 60; });
   ASSERT_TRUE(user_->start());
   user_->run(10s - 1ns);
   EXPECT_THAT(user_->seen(), SizeIs(599));
@@ -101,7 +101,7 @@ TEST_F(HidSensorTest, NothingComesUnlessEveryFeatureReportIsAsItMustBe) {
 }
 
 TEST_F(HidSensorTest, ASensorWithoutSettingsStreamsOnceItIsOpen) {
-  make([](HidDeviceTraits& sensor) { sensor.featureReports.clear(); });
+  make([](HidDeviceConfig& sensor) { sensor.featureReports.clear(); });
   user_->schedule();
   user_->run(50ms);
   EXPECT_THAT(user_->seen(), IsEmpty());
@@ -182,7 +182,7 @@ TEST_F(HidSensorTest, AStopAndAStartBeginAFreshPeriod) {
 }
 
 TEST_F(HidSensorTest, SingleReportsDifferFromAll) {
-  make([](HidDeviceTraits& sensor) {
+  make([](HidDeviceConfig& sensor) {
     sensor.every.length = 800;
     sensor.single[1].reportID = 0x75;
     sensor.single[2].length = 3;
@@ -195,7 +195,7 @@ TEST_F(HidSensorTest, SingleReportsDifferFromAll) {
 }
 
 TEST_F(HidSensorTest, AllReportsCanHaveAnotherID) {
-  make([](HidDeviceTraits& sensor) {
+  make([](HidDeviceConfig& sensor) {
     sensor.every.reportID = 0x77;
     sensor.single[1].reportID = 0x76;
   });
@@ -205,7 +205,7 @@ TEST_F(HidSensorTest, AllReportsCanHaveAnotherID) {
 }
 
 TEST_F(HidSensorTest, ASensorMaySendNoMore) {
-  make([](HidDeviceTraits& sensor) { sensor.reportCount = 2; });
+  make([](HidDeviceConfig& sensor) { sensor.reportCount = 2; });
   ASSERT_TRUE(user_->start());
   EXPECT_EQ(user_->run(1s), RunLoopResult::kTimedOut);
   EXPECT_THAT(user_->seen(), SizeIs(2));
@@ -216,7 +216,7 @@ TEST_F(HidSensorTest, ASensorMaySendNoMore) {
 }
 
 TEST_F(HidSensorTest, ASensorThatIsRemovedSaysSoOnce) {
-  make([](HidDeviceTraits& sensor) { sensor.removedAfter = 1; });
+  make([](HidDeviceConfig& sensor) { sensor.removedAfter = 1; });
   ASSERT_TRUE(user_->start());
   user_->run(1s);
   const std::string gone = refusal(HidErrorCode::kGone, "sensor has been removed.");

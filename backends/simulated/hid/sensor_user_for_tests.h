@@ -1,7 +1,7 @@
 // A phone with a HID sensor, and a user of it who writes down what comes, for the tests of this folder.
 #pragma once
 
-#include "backends/simulated/scenario/hid_traits.h"
+#include "backends/simulated/scenario/hid_config.h"
 #include "backends/simulated/scenario/scenario.h"
 #include "backends/simulated/scenario/sensor_operations.h"
 #include "contract/message_format.h"
@@ -26,8 +26,8 @@ inline constexpr std::uint16_t kTestUsage = 0x24;
 
 // "sensor", with 100 reports per second once feature report 0xAB has the value 1 and 0xAC the value 2. 0xAB takes 0 and
 // 1; 0xAC takes anything, and so does 0xAD, which does not matter.
-inline HidDeviceTraits testSensor() {
-  HidDeviceTraits sensor;
+inline HidDeviceConfig testSensor() {
+  HidDeviceConfig sensor;
   sensor.name = "sensor";
   sensor.usagePage = kTestUsagePage;
   sensor.usage = kTestUsage;
@@ -37,7 +37,7 @@ inline HidDeviceTraits testSensor() {
 }
 
 // A phone with these sensors and nothing else.
-inline Scenario sensorScenario(std::vector<HidDeviceTraits> sensors) {
+inline Scenario sensorScenario(std::vector<HidDeviceConfig> sensors) {
   Scenario scenario;
   scenario.title = "A phone with sensors";
   scenario.hidDevices = std::move(sensors);

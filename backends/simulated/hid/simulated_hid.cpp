@@ -127,12 +127,12 @@ class SimulatedHidService::Manager final : public HidManager {
   std::vector<std::shared_ptr<HidDevice>> found_;
 };
 
-SimulatedHidService::SimulatedHidService(const std::vector<HidDeviceTraits>& devices,
+SimulatedHidService::SimulatedHidService(const std::vector<HidDeviceConfig>& devices,
                                          const std::shared_ptr<Clock>& clock, Concurrency& concurrency,
                                          std::shared_ptr<CallInterceptor> calls)
     : sensors_([&] {
         auto sensors = std::make_shared<Sensors>();
-        for (const HidDeviceTraits& device : devices) {
+        for (const HidDeviceConfig& device : devices) {
           sensors->push_back(std::make_shared<HidSensor>(device, clock, concurrency));
         }
         return sensors;

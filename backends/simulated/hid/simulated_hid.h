@@ -3,7 +3,7 @@
 
 #include "backends/simulated/calls/call_interceptor.h"
 #include "backends/simulated/hid/hid_sensor.h"
-#include "backends/simulated/scenario/hid_traits.h"
+#include "backends/simulated/scenario/hid_config.h"
 #include "platform/clock.h"
 #include "platform/concurrency.h"
 #include "platform/hid.h"
@@ -20,7 +20,7 @@ namespace quazor {
 // moment, by their receivers too.
 class SimulatedHidService final : public HidService {
  public:
-  SimulatedHidService(const std::vector<HidDeviceTraits>& devices, const std::shared_ptr<Clock>& clock,
+  SimulatedHidService(const std::vector<HidDeviceConfig>& devices, const std::shared_ptr<Clock>& clock,
                       Concurrency& concurrency, std::shared_ptr<CallInterceptor> calls);
 
   std::shared_ptr<HidManager> createManager() override;

@@ -30,7 +30,7 @@ Fault fault(std::string_view operation, FaultAction action) {
 
 class SimulatedHidTest : public ::testing::Test {
  protected:
-  void make(std::vector<HidDeviceTraits> sensors) {
+  void make(std::vector<HidDeviceConfig> sensors) {
     phone_.emplace(sensorScenario(std::move(sensors)), PhoneTime::kVirtual, 1);
   }
   // The names of the devices that one of the dictionaries matches.
@@ -46,7 +46,7 @@ class SimulatedHidTest : public ::testing::Test {
 };
 
 TEST_F(SimulatedHidTest, DictionariesMatchDevicesThatHaveAllTheirEntries) {
-  HidDeviceTraits second = testSensor();
+  HidDeviceConfig second = testSensor();
   second.name = "second";
   second.usage = 0x25;
   make({testSensor(), second});
@@ -173,7 +173,7 @@ TEST_F(SimulatedHidTest, OperationsWithoutAnAnswerHaveNoEffectWhereAFaultMakesTh
 }
 
 TEST_F(SimulatedHidTest, FaultsTellDevicesAndFeatureReportsApart) {
-  HidDeviceTraits second = testSensor();
+  HidDeviceConfig second = testSensor();
   second.name = "second";
   make({testSensor(), second});
   Fault refused = fault(sensor_operation::kSetFeature, FaultAction::kFail);
@@ -206,7 +206,7 @@ TEST_F(SimulatedHidTest, CallsCanBeLateOrHang) {
 }
 
 TEST_F(SimulatedHidTest, TwoSensorsStreamSideBySide) {
-  HidDeviceTraits second = testSensor();
+  HidDeviceConfig second = testSensor();
   second.name = "second";
   second.rate = 50;
   make({testSensor(), second});

@@ -15,8 +15,8 @@ using namespace std::chrono_literals;
 using ::testing::ElementsAre;
 using ::testing::SizeIs;
 
-HidDeviceTraits fastSensor() {
-  HidDeviceTraits sensor = testSensor();
+HidDeviceConfig fastSensor() {
+  HidDeviceConfig sensor = testSensor();
   sensor.rate = 1000;
   return sensor;
 }

@@ -1,11 +1,11 @@
 // Scenario: a whole simulated phone, as data. data/scenarios/scenario.schema.json describes the files.
 #pragma once
 
-#include "backends/simulated/scenario/display_traits.h"
+#include "backends/simulated/scenario/display_config.h"
 #include "backends/simulated/scenario/fault.h"
-#include "backends/simulated/scenario/frame_traits.h"
-#include "backends/simulated/scenario/hid_traits.h"
-#include "backends/simulated/scenario/report_traits.h"
+#include "backends/simulated/scenario/frame_config.h"
+#include "backends/simulated/scenario/hid_config.h"
+#include "backends/simulated/scenario/report_config.h"
 #include "contract/ordered_map.h"
 #include "contract/value.h"
 
@@ -19,7 +19,7 @@
 namespace quazor {
 
 // Frame rates, in frames per second, are kept to a millionth and are at most this.
-inline constexpr double kHighestFrameRate = 1000;
+inline constexpr double kMaxFrameRate = 1000;
 
 struct CameraFormat {
   double maximumFrameRate = 30;
@@ -41,7 +41,7 @@ struct Camera {
   std::optional<Dictionary> errorCounters = defaultErrorCounters();  // nothing: cannot be read
   Dictionary errorCounterGrowth;       // errors per second of the stream's present or last stretch, by counter
   std::optional<Projector> projector;  // nothing: the camera has none
-  DeliveryTraits delivery;
+  DeliveryConfig delivery;
 
   // All of the counters that the hardware has, at 0.
   static Dictionary defaultErrorCounters();
@@ -55,7 +55,7 @@ struct CameraGroup {
   bool masterConfiguration = true;   // supports SlaveConfigurationByPortType in MasterConfiguration
 };
 
-struct CaptureDeviceTraits {
+struct CaptureDeviceConfig {
   bool plugInLoads = true;  // false: no capture plug-in can be made
   bool present = true;      // false: the plug-in finds no device
 };
@@ -80,12 +80,12 @@ struct Expectation {
 
 struct Scenario {
   std::string title;
-  CaptureDeviceTraits device;
+  CaptureDeviceConfig device;
   std::vector<Camera> cameras;
   std::vector<CameraGroup> groups;
-  std::vector<ReportChannelTraits> reports;
-  std::vector<HidDeviceTraits> hidDevices;
-  DisplayTraits display;
+  std::vector<ReportChannelConfig> reports;
+  std::vector<HidDeviceConfig> hidDevices;
+  DisplayConfig display;
   std::vector<Fault> faults;
   OrderedMap<Expectation> expectations;  // by the diagnostic's name, or any name of a run of an experiment
 };

@@ -1,6 +1,6 @@
 #include "backends/simulated/scenario/scenario_content.h"
 
-#include "backends/simulated/scenario/capture_catalogue.h"
+#include "backends/simulated/scenario/property_table.h"
 #include "backends/simulated/scenario/report_operations.h"
 #include "backends/simulated/scenario/scenario_frames.h"
 #include "backends/simulated/scenario/scenario_parts.h"
@@ -19,8 +19,8 @@ namespace {
 
 using Names = std::vector<std::string_view>;
 
-constexpr std::uint64_t kMostFrames = 1'000'000'000;
-constexpr double kLongestDelay = 1e9;
+constexpr std::uint64_t kMaxFrames = 1'000'000'000;
+constexpr double kMaxDelay = 1e9;
 
 bool booleanOr(const JsonCursor& object, std::string_view key, bool otherwise) {
   const std::optional<JsonCursor> entry = object.find(key);
@@ -49,9 +49,9 @@ Names idsOf(const std::vector<CameraGroup>& groups) {
   return ids;
 }
 
-CaptureDeviceTraits readDevice(const JsonCursor& cursor) {
+CaptureDeviceConfig readDevice(const JsonCursor& cursor) {
   cursor.allowKeys({"plugInLoads", "present"});
-  CaptureDeviceTraits device;
+  CaptureDeviceConfig device;
   device.plugInLoads = booleanOr(cursor, "plugInLoads", device.plugInLoads);
   device.present = booleanOr(cursor, "present", device.present);
   return device;
@@ -61,7 +61,7 @@ std::vector<CameraFormat> readFormats(const JsonCursor& cursor) {
   std::vector<CameraFormat> formats;
   for (const JsonCursor& element : cursor.elements()) {
     element.allowKeys({"maximumFrameRate"});
-    formats.push_back({element.at("maximumFrameRate").positiveNumber(kHighestFrameRate)});
+    formats.push_back({element.at("maximumFrameRate").positiveNumber(kMaxFrameRate)});
   }
   if (formats.empty()) cursor.fail("a camera must have at least one format.");
   return formats;
@@ -70,7 +70,7 @@ std::vector<CameraFormat> readFormats(const JsonCursor& cursor) {
 std::set<std::uint64_t> readDroppedFrames(const JsonCursor& cursor) {
   std::set<std::uint64_t> frames;
   for (const JsonCursor& element : cursor.elements()) {
-    if (!frames.insert(element.integer(0, kMostFrames)).second) element.fail("the frame stands twice; leave one.");
+    if (!frames.insert(element.integer(0, kMaxFrames)).second) element.fail("the frame stands twice; leave one.");
   }
   return frames;
 }
@@ -100,11 +100,10 @@ Camera readCamera(const std::string& id, const JsonCursor& cursor) {
   camera.multipleOutputs = booleanOr(cursor, "multipleOutputs", camera.multipleOutputs);
   camera.deliversFrames = booleanOr(cursor, "deliversFrames", camera.deliversFrames);
   camera.inSessionStatus = booleanOr(cursor, "inSessionStatus", camera.inSessionStatus);
-  if (const auto offset = cursor.find("firstFrameOffset")) camera.firstFrameOffset = offset->integer(0, kMostFrames);
-  if (const auto rate = cursor.find("actualFrameRate"))
-    camera.actualFrameRate = rate->positiveNumber(kHighestFrameRate);
+  if (const auto offset = cursor.find("firstFrameOffset")) camera.firstFrameOffset = offset->integer(0, kMaxFrames);
+  if (const auto rate = cursor.find("actualFrameRate")) camera.actualFrameRate = rate->positiveNumber(kMaxFrameRate);
   if (const auto frames = cursor.find("droppedFrames")) camera.droppedFrames = readDroppedFrames(*frames);
-  if (const auto every = cursor.find("dropEvery")) camera.dropEvery = every->integer(1, kMostFrames);
+  if (const auto every = cursor.find("dropEvery")) camera.dropEvery = every->integer(1, kMaxFrames);
   if (const auto counters = cursor.find("errorCounters")) camera.errorCounters = readErrorCounters(*counters);
   if (const auto growth = cursor.find("errorCounterGrowth"))
     camera.errorCounterGrowth = readErrorCounterGrowth(*growth);
@@ -150,7 +149,7 @@ struct Selectable {
     for (const CaptureProperty& property : propertiesOf(operation.on)) append(properties, {property.key});
   }
   void add(const SensorOperation& operation, const Scenario& scenario) {
-    for (const HidDeviceTraits& device : scenario.hidDevices) {
+    for (const HidDeviceConfig& device : scenario.hidDevices) {
       if (operation.onDevice) append(objects, {device.name});
       if (operation.property != SensorProperty::kFeatureReport) continue;
       for (const HidFeatureReport& report : device.featureReports) append(properties, {hidReportName(report.id)});
@@ -190,7 +189,7 @@ void readSelectors(const JsonCursor& cursor, const Scenario& scenario, Fault& fa
     if (selectable.properties.empty()) property->fail(fault.operation + " is about no property; leave it out.");
     fault.property = property->oneOf(selectable.properties, "a property of " + fault.operation);
   }
-  if (const auto occurrence = cursor.find("occurrence")) fault.occurrence = occurrence->integer(1, kMostFrames);
+  if (const auto occurrence = cursor.find("occurrence")) fault.occurrence = occurrence->integer(1, kMaxFrames);
 }
 
 Fault readFault(const JsonCursor& cursor, const Scenario& scenario) {
@@ -209,7 +208,7 @@ Fault readFault(const JsonCursor& cursor, const Scenario& scenario) {
     fault.error = readError(*error);
   }
   if (fault.action == FaultAction::kDelay) {
-    fault.seconds = cursor.at("seconds").positiveNumber(kLongestDelay);
+    fault.seconds = cursor.at("seconds").positiveNumber(kMaxDelay);
   } else if (const auto seconds = cursor.find("seconds")) {
     seconds->fail("only the action \"delay\" has seconds.");
   }
@@ -220,10 +219,10 @@ ExperimentRun readExperimentRun(const JsonCursor& cursor) {
   ExperimentRun run;
   run.name = cursor.at("experiment").text();
   if (const auto parameters = cursor.find("parameters")) {
-    constexpr double kHighest = std::numeric_limits<double>::max();
-    for (const auto& [name, value] : parameters->entries()) run.parameters.set(name, value.number(-kHighest, kHighest));
+    constexpr double kMaximum = std::numeric_limits<double>::max();
+    for (const auto& [name, value] : parameters->entries()) run.parameters.set(name, value.number(-kMaximum, kMaximum));
   }
-  if (const auto images = cursor.find("images")) run.images = images->integer(0, kMostFrames);
+  if (const auto images = cursor.find("images")) run.images = images->integer(0, kMaxFrames);
   return run;
 }
 

@@ -13,8 +13,8 @@
 namespace quazor {
 namespace {
 
-constexpr std::uint64_t kMost = 1'000'000'000;
-constexpr std::uint64_t kMostQueues = 64;
+constexpr std::uint64_t kMaxCount = 1'000'000'000;
+constexpr std::uint64_t kMaxQueues = 64;
 constexpr double kLatest = 1e9;
 constexpr std::uint64_t kAnyCount = std::numeric_limits<std::uint64_t>::max();
 
@@ -40,8 +40,8 @@ std::chrono::nanoseconds readTime(const JsonCursor& cursor) {
   return nanosecondsFromSeconds(cursor.positiveNumber(kLatest));
 }
 
-ReportChannelTraits readChannel(const JsonCursor& cursor) {
-  ReportChannelTraits channel;
+ReportChannelConfig readChannel(const JsonCursor& cursor) {
+  ReportChannelConfig channel;
   const auto readCount = [&channel](const JsonCursor& count) {
     if (count.isString()) {
       constexpr std::array<std::string_view, 1> kWords{"none"};
@@ -57,7 +57,7 @@ ReportChannelTraits readChannel(const JsonCursor& cursor) {
   }
   cursor.allowKeys({"count", "growth", "growthAt"});
   if (const auto count = cursor.find("count")) readCount(*count);
-  if (const auto growth = cursor.find("growth")) channel.growth = growth->integer(0, kMost);
+  if (const auto growth = cursor.find("growth")) channel.growth = growth->integer(0, kMaxCount);
   if (const auto steps = cursor.find("growthAt")) {
     for (const JsonCursor& step : steps->elements()) {
       step.allowKeys({"at", "by"});
@@ -76,19 +76,19 @@ Projector readProjector(const JsonCursor& cursor) {
   if (const auto frames = cursor.find("frames")) {
     for (const auto& [number, frame] : frames->entries()) {
       frame.allowKeys({"attachment", "metadata", "without"});
-      readMetadata(frame, projector.frames[readNumberKey(number, "a frame", kMost, frame)]);
+      readMetadata(frame, projector.frames[readNumberKey(number, "a frame", kMaxCount, frame)]);
     }
   }
   return projector;
 }
 
-DeliveryTraits readDelivery(const JsonCursor& cursor) {
+DeliveryConfig readDelivery(const JsonCursor& cursor) {
   cursor.allowKeys({"bursts", "events", "framesAfterStop", "queues", "stopWaitsForHandlers"});
-  DeliveryTraits delivery;
+  DeliveryConfig delivery;
   if (const auto bursts = cursor.find("bursts")) {
     for (const JsonCursor& burst : bursts->elements()) {
       burst.allowKeys({"at", "count"});
-      delivery.bursts.push_back({burst.at("at").integer(0, kMost), burst.at("count").integer(1, kMost)});
+      delivery.bursts.push_back({burst.at("at").integer(0, kMaxCount), burst.at("count").integer(1, kMaxCount)});
     }
   }
   if (const auto events = cursor.find("events")) {
@@ -99,24 +99,24 @@ DeliveryTraits readDelivery(const JsonCursor& cursor) {
       delivery.events.push_back({readTime(event.at("at")), static_cast<std::int32_t>(number.integer())});
     }
   }
-  if (const auto late = cursor.find("framesAfterStop")) delivery.framesAfterStop = late->integer(0, kMost);
-  if (const auto queues = cursor.find("queues")) delivery.queues = queues->integer(1, kMostQueues);
+  if (const auto late = cursor.find("framesAfterStop")) delivery.framesAfterStop = late->integer(0, kMaxCount);
+  if (const auto queues = cursor.find("queues")) delivery.queues = queues->integer(1, kMaxQueues);
   if (const auto waits = cursor.find("stopWaitsForHandlers")) delivery.stopWaitsForHandlers = waits->boolean();
   return delivery;
 }
 
 Dictionary readErrorCounterGrowth(const JsonCursor& cursor) {
   Dictionary growth;
-  for (const auto& [name, perSecond] : cursor.entries()) growth.set(name, perSecond.integer(0, kMost));
+  for (const auto& [name, perSecond] : cursor.entries()) growth.set(name, perSecond.integer(0, kMaxCount));
   return growth;
 }
 
-std::vector<ReportChannelTraits> readReports(const JsonCursor& cursor) {
-  std::vector<ReportChannelTraits> channels;
+std::vector<ReportChannelConfig> readReports(const JsonCursor& cursor) {
+  std::vector<ReportChannelConfig> channels;
   for (const auto& [group, subGroups] : cursor.entries()) {
     for (const auto& [subGroup, names] : subGroups.entries()) {
       for (const auto& [name, entry] : names.entries()) {
-        ReportChannelTraits channel = readChannel(entry);
+        ReportChannelConfig channel = readChannel(entry);
         channel.group = group;
         channel.subGroup = subGroup;
         channel.name = name;

@@ -43,7 +43,7 @@ TEST(ScenarioFramesTest, AProjectorIsRead) {
 }
 
 TEST(ScenarioFramesTest, ADeliveryIsRead) {
-  const DeliveryTraits delivery = readText(readDelivery, R"({
+  const DeliveryConfig delivery = readText(readDelivery, R"({
     "bursts": [{"at": 3, "count": 4}], "events": [{"at": 0.5, "number": -2147483648}],
     "framesAfterStop": 5, "queues": 6, "stopWaitsForHandlers": false})");
   ASSERT_THAT(delivery.bursts, SizeIs(1));
@@ -58,14 +58,14 @@ TEST(ScenarioFramesTest, ADeliveryIsRead) {
 }
 
 TEST(ScenarioFramesTest, ADeliveryIsOrdinaryUnlessItSaysMore) {
-  const DeliveryTraits delivery = readText(readDelivery, "{}");
+  const DeliveryConfig delivery = readText(readDelivery, "{}");
   EXPECT_EQ(delivery.queues, 1U);
   EXPECT_EQ(delivery.framesAfterStop, 0U);
   EXPECT_TRUE(delivery.stopWaitsForHandlers);
 }
 
 TEST(ScenarioFramesTest, ReportChannelsAreRead) {
-  const std::vector<ReportChannelTraits> channels = readText(readReports, R"({
+  const std::vector<ReportChannelConfig> channels = readText(readReports, R"({
     "A": {"s": {"x": 3, "y": "none"}, "t": {}},
     "B": {"s": {"x": {"count": 4, "growth": 5, "growthAt": [{"at": 0.25, "by": 6}]}, "z": {"count": "none"}, "w": {}}}})");
   ASSERT_THAT(channels, SizeIs(5));

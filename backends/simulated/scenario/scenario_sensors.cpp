@@ -11,10 +11,10 @@
 namespace quazor {
 namespace {
 
-constexpr std::uint64_t kMostReports = 1'000'000'000;
-constexpr std::uint64_t kLongestReport = 16384;
-constexpr double kHighestRate = 1000;
-constexpr double kLargestAngle = 360;
+constexpr std::uint64_t kMaxReports = 1'000'000'000;
+constexpr std::uint64_t kMaxReportLength = 16384;
+constexpr double kMaxRate = 1000;
+constexpr double kMaxAngle = 360;
 constexpr double kHottest = 1000;
 constexpr std::uint64_t kHighest16 = std::numeric_limits<std::uint16_t>::max();
 constexpr std::uint64_t kHighest8 = std::numeric_limits<std::uint8_t>::max();
@@ -54,7 +54,7 @@ HidFeatureReport readFeatureReport(const std::string& id, const JsonCursor& curs
 
 void readShape(const JsonCursor& cursor, HidReportShape& shape) {
   if (const auto id = cursor.find("reportID")) shape.reportID = readReportID(id->text(), *id);
-  if (const auto length = cursor.find("length")) shape.length = length->integer(1, kLongestReport);
+  if (const auto length = cursor.find("length")) shape.length = length->integer(1, kMaxReportLength);
 }
 
 HidReportShape readSingle(const JsonCursor& cursor) {
@@ -68,18 +68,18 @@ HidReportShape readSingle(const JsonCursor& cursor) {
   return shape;
 }
 
-void readInputReports(const JsonCursor& cursor, HidDeviceTraits& device) {
+void readInputReports(const JsonCursor& cursor, HidDeviceConfig& device) {
   cursor.allowKeys({"rate", "count", "removedAfter", "reportID", "length", "single"});
-  if (const auto rate = cursor.find("rate")) device.rate = rate->positiveNumber(kHighestRate);
-  if (const auto count = cursor.find("count")) device.reportCount = count->integer(0, kMostReports);
+  if (const auto rate = cursor.find("rate")) device.rate = rate->positiveNumber(kMaxRate);
+  if (const auto count = cursor.find("count")) device.reportCount = count->integer(0, kMaxReports);
   if (const auto removed = cursor.find("removedAfter")) {
     if (device.reportCount) removed->fail("a device that is removed sends no more anyway; leave out \"count\".");
-    device.removedAfter = removed->integer(0, kMostReports);
+    device.removedAfter = removed->integer(0, kMaxReports);
   }
   readShape(cursor, device.every);
   if (const auto single = cursor.find("single")) {
     for (const auto& [number, shape] : single->entries()) {
-      device.single[readNumberKey(number, "a report", kMostReports, shape)] = readSingle(shape);
+      device.single[readNumberKey(number, "a report", kMaxReports, shape)] = readSingle(shape);
     }
   }
 }
@@ -94,9 +94,9 @@ HidImages readImages(const JsonCursor& cursor) {
   if (const auto amplitude = cursor.find("amplitude")) images.amplitude = readSigned32(*amplitude);
   if (const auto offset = cursor.find("offsetI")) images.offsetI = readSigned32(*offset);
   if (const auto offset = cursor.find("offsetQ")) images.offsetQ = readSigned32(*offset);
-  if (const auto step = cursor.find("phaseStep")) images.phaseStep = step->number(-kLargestAngle, kLargestAngle);
+  if (const auto step = cursor.find("phaseStep")) images.phaseStep = step->number(-kMaxAngle, kMaxAngle);
   if (const auto step = cursor.find("phaseStepPerImage")) {
-    images.phaseStepPerImage = step->number(-kLargestAngle, kLargestAngle);
+    images.phaseStepPerImage = step->number(-kMaxAngle, kMaxAngle);
   }
   if (const auto temperature = cursor.find("temperature")) {
     images.temperature = static_cast<float>(temperature->number(-kHottest, kHottest));
@@ -118,9 +118,9 @@ Value readValue(const JsonCursor& cursor) {
 
 }  // namespace
 
-HidDeviceTraits readHidDevice(const std::string& name, const JsonCursor& cursor) {
+HidDeviceConfig readHidDevice(const std::string& name, const JsonCursor& cursor) {
   cursor.allowKeys({"usagePage", "usage", "featureReports", "reports", "images"});
-  HidDeviceTraits device;
+  HidDeviceConfig device;
   device.name = name;
   device.usagePage = static_cast<std::uint16_t>(cursor.at("usagePage").integer(0, kHighest16));
   device.usage = static_cast<std::uint16_t>(cursor.at("usage").integer(0, kHighest16));
@@ -132,9 +132,9 @@ HidDeviceTraits readHidDevice(const std::string& name, const JsonCursor& cursor)
   return device;
 }
 
-DisplayTraits readDisplay(const JsonCursor& cursor) {
+DisplayConfig readDisplay(const JsonCursor& cursor) {
   cursor.allowKeys({"present", "registryService", "properties"});
-  DisplayTraits display;
+  DisplayConfig display;
   if (const auto present = cursor.find("present")) display.present = present->boolean();
   if (const auto service = cursor.find("registryService")) display.registryService = service->boolean();
   if (const auto properties = cursor.find("properties")) {

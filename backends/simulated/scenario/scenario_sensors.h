@@ -1,8 +1,8 @@
 // The parts of a scenario's document that describe HID devices and the display.
 #pragma once
 
-#include "backends/simulated/scenario/display_traits.h"
-#include "backends/simulated/scenario/hid_traits.h"
+#include "backends/simulated/scenario/display_config.h"
+#include "backends/simulated/scenario/hid_config.h"
 #include "base/json/json_cursor.h"
 
 #include <string>
@@ -10,7 +10,7 @@
 namespace quazor {
 
 // Both throw JsonProblem, "PATH: ...".
-HidDeviceTraits readHidDevice(const std::string& name, const JsonCursor& cursor);
-DisplayTraits readDisplay(const JsonCursor& cursor);
+HidDeviceConfig readHidDevice(const std::string& name, const JsonCursor& cursor);
+DisplayConfig readDisplay(const JsonCursor& cursor);
 
 }  // namespace quazor

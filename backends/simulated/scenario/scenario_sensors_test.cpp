@@ -15,11 +15,11 @@ using ::testing::IsEmpty;
 using ::testing::SizeIs;
 using Json = nlohmann::ordered_json;
 
-HidDeviceTraits readDevice(std::string_view text) {
+HidDeviceConfig readDevice(std::string_view text) {
   const Json document = Json::parse(text);
   return readHidDevice("sensor", JsonCursor(document));
 }
-DisplayTraits readDisplayText(std::string_view text) {
+DisplayConfig readDisplayText(std::string_view text) {
   const Json document = Json::parse(text);
   return readDisplay(JsonCursor(document));
 }
@@ -34,7 +34,7 @@ std::string problemOf(const std::function<void()>& read) {
 }
 
 TEST(ScenarioSensorsTest, ADeviceIsRead) {
-  const HidDeviceTraits device = readDevice(R"({
+  const HidDeviceConfig device = readDevice(R"({
     "usagePage": 65280, "usage": 36,
     "featureReports": {"0xAB": {"accepts": [0, 1], "streamsAt": 1}, "0x0C": {}, "0xFF": {"streamsAt": 255}},
     "reports": {"rate": 12.5, "count": 7, "reportID": "0x77", "length": 16384,
@@ -73,7 +73,7 @@ TEST(ScenarioSensorsTest, ADeviceIsRead) {
 }
 
 TEST(ScenarioSensorsTest, ADeviceIsOrdinaryUnlessItSaysMore) {
-  const HidDeviceTraits device = readDevice(R"({"usagePage": 0, "usage": 65535})");
+  const HidDeviceConfig device = readDevice(R"({"usagePage": 0, "usage": 65535})");
   EXPECT_EQ(device.usage, 65535);
   EXPECT_THAT(device.featureReports, IsEmpty());
   EXPECT_EQ(device.rate, 60);
@@ -95,7 +95,7 @@ TEST(ScenarioSensorsTest, ADeviceMayBeRemoved) {
 }
 
 TEST(ScenarioSensorsTest, ADisplayIsRead) {
-  const DisplayTraits display = readDisplayText(R"({
+  const DisplayConfig display = readDisplayText(R"({
     "present": false, "registryService": false,
     "properties": {"A": {"B": {"C": 1}, "D": []}, "E": [1, "x", {"F": true}, [2.5]], "G": 18446744073709551615}})");
   EXPECT_FALSE(display.present);
@@ -107,7 +107,7 @@ TEST(ScenarioSensorsTest, ADisplayIsRead) {
 }
 
 TEST(ScenarioSensorsTest, ADisplayIsThereUnlessItSaysOtherwise) {
-  const DisplayTraits display = readDisplayText("{}");
+  const DisplayConfig display = readDisplayText("{}");
   EXPECT_TRUE(display.present);
   EXPECT_TRUE(display.registryService);
   EXPECT_THAT(display.properties, IsEmpty());

@@ -34,12 +34,12 @@ VirtualRunLoops::VirtualRunLoops(std::shared_ptr<VirtualScheduler> scheduler)
 VirtualRunLoops::~VirtualRunLoops() = default;
 
 RunLoop* VirtualRunLoops::currentRunLoop() {
-  const std::shared_ptr<VirtualScheduler::Lane> lane = scheduler_->currentLane();
-  if (lane == nullptr) return main_loop_.get();
-  const auto found = lane_loops_.find(lane);
-  if (found != lane_loops_.end()) return found->second.get();
-  std::erase_if(lane_loops_, [](const auto& entry) { return entry.first.expired(); });
-  return lane_loops_.emplace(lane, makeLoop(scheduler_)).first->second.get();
+  const std::shared_ptr<VirtualScheduler::Strand> strand = scheduler_->currentStrand();
+  if (strand == nullptr) return main_loop_.get();
+  const auto found = strand_loops_.find(strand);
+  if (found != strand_loops_.end()) return found->second.get();
+  std::erase_if(strand_loops_, [](const auto& entry) { return entry.first.expired(); });
+  return strand_loops_.emplace(strand, makeLoop(scheduler_)).first->second.get();
 }
 
 }  // namespace quazor

@@ -24,11 +24,11 @@ class VirtualRunLoops final : public RunLoops {
   RunLoop* currentRunLoop() override;
 
  private:
-  using Lane = std::weak_ptr<VirtualScheduler::Lane>;
+  using Strand = std::weak_ptr<VirtualScheduler::Strand>;
 
   std::shared_ptr<VirtualScheduler> scheduler_;
   std::unique_ptr<RunLoop> main_loop_;
-  std::map<Lane, std::unique_ptr<RunLoop>, std::owner_less<Lane>> lane_loops_;
+  std::map<Strand, std::unique_ptr<RunLoop>, std::owner_less<Strand>> strand_loops_;
 };
 
 }  // namespace quazor

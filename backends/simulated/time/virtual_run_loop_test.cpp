@@ -29,7 +29,7 @@ class VirtualRunLoopUnderTest {
 
  private:
   std::shared_ptr<VirtualScheduler> scheduler_ =
-      std::make_shared<VirtualScheduler>(std::make_shared<SeededChooser>(seed));
+      std::make_shared<VirtualScheduler>(std::make_shared<RandomStrategy>(seed));
   VirtualRunLoops loops_{scheduler_};
 };
 
@@ -48,7 +48,8 @@ class VirtualRunLoopTest : public ::testing::Test {
   void settle() { VirtualClock(scheduler_).sleep(1ns); }
 
   int gone_ = 0;  // handlers, also those that go with their loops
-  std::shared_ptr<VirtualScheduler> scheduler_ = std::make_shared<VirtualScheduler>(std::make_shared<SeededChooser>(3));
+  std::shared_ptr<VirtualScheduler> scheduler_ =
+      std::make_shared<VirtualScheduler>(std::make_shared<RandomStrategy>(3));
   VirtualRunLoops loops_{scheduler_};
 };
 

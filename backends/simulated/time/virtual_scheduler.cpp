@@ -15,8 +15,8 @@ class VirtualScheduler::Flow {
  public:
   Flow() : fiber_([this] { runTask(); }) {}
 
-  void begin(std::shared_ptr<Lane> lane, Task task) {
-    lane_ = std::move(lane);
+  void begin(std::shared_ptr<Strand> strand, Task task) {
+    lane_ = std::move(strand);
     task_ = std::move(task);
   }
   // Runs until the task blocks or has ended.
@@ -35,9 +35,9 @@ class VirtualScheduler::Flow {
 
   // The call that the task is blocked in; null when it has ended.
   const Wait* wait() const { return wait_; }
-  const std::shared_ptr<Lane>& lane() const { return lane_; }
+  const std::shared_ptr<Strand>& strand() const { return lane_; }
   // Of a task that has ended: its lane, and what it threw, if it did.
-  std::shared_ptr<Lane> takeLane() { return std::exchange(lane_, nullptr); }
+  std::shared_ptr<Strand> takeLane() { return std::exchange(lane_, nullptr); }
   std::exception_ptr takeFailure() { return std::exchange(failure_, nullptr); }
   bool cancelled() const { return cancelled_; }
 
@@ -51,7 +51,7 @@ class VirtualScheduler::Flow {
     task_.reset();
   }
 
-  std::shared_ptr<Lane> lane_;
+  std::shared_ptr<Strand> lane_;
   Task task_;
   const Wait* wait_ = nullptr;
   bool cancelled_ = false;
@@ -59,7 +59,7 @@ class VirtualScheduler::Flow {
   Fiber fiber_;
 };
 
-VirtualScheduler::VirtualScheduler(std::shared_ptr<Chooser> chooser) : chooser_(std::move(chooser)) {}
+VirtualScheduler::VirtualScheduler(std::shared_ptr<ScheduleStrategy> chooser) : chooser_(std::move(chooser)) {}
 
 VirtualScheduler::~VirtualScheduler() { discardPending(); }
 
@@ -68,29 +68,29 @@ std::chrono::nanoseconds VirtualScheduler::after(std::chrono::nanoseconds delay)
   return delay >= kNever - now_ ? kNever : now_ + delay;
 }
 
-std::shared_ptr<VirtualScheduler::Lane> VirtualScheduler::makeLane() { return std::make_shared<Lane>(); }
+std::shared_ptr<VirtualScheduler::Strand> VirtualScheduler::makeStrand() { return std::make_shared<Strand>(); }
 
-std::shared_ptr<VirtualScheduler::Lane> VirtualScheduler::currentLane() const {
-  return current_ != nullptr ? current_->lane() : nullptr;
+std::shared_ptr<VirtualScheduler::Strand> VirtualScheduler::currentStrand() const {
+  return current_ != nullptr ? current_->strand() : nullptr;
 }
 
-void VirtualScheduler::submit(const std::shared_ptr<Lane>& lane, Task task) {
-  lane->due.push_back(std::move(task));
-  if (!lane->running && lane->due.size() == 1) runnable_.push_back(lane);
+void VirtualScheduler::submit(const std::shared_ptr<Strand>& strand, Task task) {
+  strand->due.push_back(std::move(task));
+  if (!strand->running && strand->due.size() == 1) runnable_.push_back(strand);
 }
 
-void VirtualScheduler::submitAt(std::chrono::nanoseconds due, const std::shared_ptr<Lane>& lane, Task task) {
+void VirtualScheduler::submitAt(std::chrono::nanoseconds due, const std::shared_ptr<Strand>& strand, Task task) {
   if (due <= now_) {
-    submit(lane, std::move(task));
+    submit(strand, std::move(task));
   } else {
-    delayed_.emplace(DueTime{due, submitted_++}, Delayed{lane, std::move(task)});
+    delayed_.emplace(DueTime{due, submitted_++}, Delayed{strand, std::move(task)});
   }
 }
 
-void VirtualScheduler::dropDelayed(const Lane& lane) {
+void VirtualScheduler::dropDelayed(const Strand& strand) {
   std::vector<Task> dropped;  // destroyed at the end: a task's destructor may call back into the scheduler
   for (auto entry = delayed_.begin(); entry != delayed_.end();) {
-    if (entry->second.lane.get() == &lane) {
+    if (entry->second.strand.get() == &strand) {
       dropped.push_back(std::move(entry->second.task));
       entry = delayed_.erase(entry);
     } else {
@@ -107,11 +107,11 @@ void VirtualScheduler::discardPending() {
     }
     std::map<DueTime, Delayed> delayed;
     delayed.swap(delayed_);
-    std::vector<std::shared_ptr<Lane>> lanes;
-    lanes.swap(runnable_);
-    for (const std::shared_ptr<Lane>& lane : lanes) {
+    std::vector<std::shared_ptr<Strand>> strands;
+    strands.swap(runnable_);
+    for (const std::shared_ptr<Strand>& strand : strands) {
       std::deque<Task> due;
-      due.swap(lane->due);
+      due.swap(strand->due);
     }
   }
 }
@@ -193,12 +193,12 @@ void VirtualScheduler::beginTaskOf(std::size_t position) {
     flow = std::move(idle_.back());
     idle_.pop_back();
   }
-  std::shared_ptr<Lane> lane = runnable_[position];
+  std::shared_ptr<Strand> strand = runnable_[position];
   runnable_.erase(runnable_.begin() + static_cast<std::ptrdiff_t>(position));
-  lane->running = true;
-  Task task = std::move(lane->due.front());
-  lane->due.pop_front();
-  flow->begin(std::move(lane), std::move(task));
+  strand->running = true;
+  Task task = std::move(strand->due.front());
+  strand->due.pop_front();
+  flow->begin(std::move(strand), std::move(task));
   resume(std::move(flow));
 }
 
@@ -210,9 +210,9 @@ void VirtualScheduler::resume(std::unique_ptr<Flow> flow) {
     blocked_.push_back(std::move(flow));
     return;
   }
-  const std::shared_ptr<Lane> lane = flow->takeLane();
-  lane->running = false;
-  if (!lane->due.empty()) runnable_.push_back(lane);
+  const std::shared_ptr<Strand> strand = flow->takeLane();
+  strand->running = false;
+  if (!strand->due.empty()) runnable_.push_back(strand);
   const std::exception_ptr failure = flow->takeFailure();
   if (flow->cancelled()) return;  // it threw because it was told to
   idle_.push_back(std::move(flow));
@@ -223,7 +223,7 @@ void VirtualScheduler::advanceTo(std::chrono::nanoseconds time) {
   now_ = time;
   while (!delayed_.empty() && delayed_.begin()->first.first <= now_) {
     auto entry = delayed_.extract(delayed_.begin());
-    submit(entry.mapped().lane, std::move(entry.mapped().task));
+    submit(entry.mapped().strand, std::move(entry.mapped().task));
   }
 }
 

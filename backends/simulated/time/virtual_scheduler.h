@@ -1,7 +1,7 @@
 // VirtualScheduler: virtual time on one thread.
 #pragma once
 
-#include "backends/simulated/time/chooser.h"
+#include "backends/simulated/time/schedule_strategy.h"
 #include "platform/task.h"
 
 #include <chrono>
@@ -35,8 +35,8 @@ class VirtualScheduler final {
   // Due times that do not fit the clock become this one; it never comes.
   static constexpr std::chrono::nanoseconds kNever = std::chrono::nanoseconds::max();
 
-  // A sequence of tasks that never overlap. Made by makeLane; it lives as long as it is held or has tasks.
-  class Lane {
+  // A sequence of tasks that never overlap. Made by makeStrand; it lives as long as it is held or has tasks.
+  class Strand {
    private:
     friend class VirtualScheduler;
     std::deque<Task> due;  // waiting to run, in order
@@ -44,7 +44,7 @@ class VirtualScheduler final {
   };
 
   // `chooser` must not be null.
-  explicit VirtualScheduler(std::shared_ptr<Chooser> chooser);
+  explicit VirtualScheduler(std::shared_ptr<ScheduleStrategy> chooser);
   VirtualScheduler(const VirtualScheduler&) = delete;
   VirtualScheduler& operator=(const VirtualScheduler&) = delete;
   // As discardPending().
@@ -55,15 +55,15 @@ class VirtualScheduler final {
   // The moment `delay` from now: now for zero and less, kNever beyond the clock's range.
   std::chrono::nanoseconds after(std::chrono::nanoseconds delay) const;
 
-  std::shared_ptr<Lane> makeLane();
+  std::shared_ptr<Strand> makeStrand();
   // The lane of the task that is executing; null when it is the main flow.
-  std::shared_ptr<Lane> currentLane() const;
+  std::shared_ptr<Strand> currentStrand() const;
   // Adds a task at the end of the lane.
-  void submit(const std::shared_ptr<Lane>& lane, Task task);
+  void submit(const std::shared_ptr<Strand>& strand, Task task);
   // Adds the task when its time has come, behind those that are waiting then; at once when it has come already.
-  void submitAt(std::chrono::nanoseconds due, const std::shared_ptr<Lane>& lane, Task task);
+  void submitAt(std::chrono::nanoseconds due, const std::shared_ptr<Strand>& strand, Task task);
   // Destroys the lane's tasks whose time has not come.
-  void dropDelayed(const Lane& lane);
+  void dropDelayed(const Strand& strand);
   // Destroys all pending tasks, and those that their destruction submits; a task that has begun and blocks gets a
   // SimulationStall out of its blocking call. Breaks the circle of a pending task that holds an object that holds the
   // scheduler. The scheduler goes on working.
@@ -85,7 +85,7 @@ class VirtualScheduler final {
  private:
   class Flow;
   struct Delayed {
-    std::shared_ptr<Lane> lane;
+    std::shared_ptr<Strand> strand;
     Task task;
   };
   using DueTime = std::pair<std::chrono::nanoseconds, std::uint64_t>;  // equal times keep the order of submission
@@ -101,18 +101,18 @@ class VirtualScheduler final {
   void runUntilReady(const Wait& wait);
   std::chrono::nanoseconds nextDue(std::chrono::nanoseconds due) const;
   std::size_t choose(std::size_t count);
-  void beginTaskOf(std::size_t lane);
+  void beginTaskOf(std::size_t strand);
   void resume(std::unique_ptr<Flow> flow);
   void advanceTo(std::chrono::nanoseconds time);
 
-  std::shared_ptr<Chooser> chooser_;
+  std::shared_ptr<ScheduleStrategy> chooser_;
   std::chrono::nanoseconds now_{0};
   std::uint64_t submitted_ = 0;
-  std::map<DueTime, Delayed> delayed_;           // all after now_
-  std::vector<std::shared_ptr<Lane>> runnable_;  // lanes with due tasks of which none is running, longest there first
-  Flow* current_ = nullptr;                      // the task that is executing; null while the main flow is
-  std::vector<std::unique_ptr<Flow>> blocked_;   // tasks in a blocking call, longest there first
-  std::vector<std::unique_ptr<Flow>> idle_;      // kept for their stacks
+  std::map<DueTime, Delayed> delayed_;             // all after now_
+  std::vector<std::shared_ptr<Strand>> runnable_;  // lanes with due tasks of which none is running, longest there first
+  Flow* current_ = nullptr;                        // the task that is executing; null while the main flow is
+  std::vector<std::unique_ptr<Flow>> blocked_;     // tasks in a blocking call, longest there first
+  std::vector<std::unique_ptr<Flow>> idle_;        // kept for their stacks
 };
 
 }  // namespace quazor

@@ -23,7 +23,7 @@ using ::testing::UnorderedElementsAre;
 using Words = std::vector<std::string>;
 
 // Chooses as told, then always the first; keeps how many things there were to choose from.
-class ScriptedChooser final : public Chooser {
+class ScriptedChooser final : public ScheduleStrategy {
  public:
   explicit ScriptedChooser(std::vector<std::size_t> script = {}) : script_(std::move(script)) {}
 
@@ -49,25 +49,25 @@ class VirtualSchedulerTest : public ::testing::Test {
 };
 
 TEST_F(VirtualSchedulerTest, TimeBeginsAtZeroAndStandsStillUntilSomethingBlocks) {
-  const auto lane = scheduler_.makeLane();
-  scheduler_.submit(lane, say("task"));
-  scheduler_.submitAt(1s, lane, say("delayed"));
+  const auto strand = scheduler_.makeStrand();
+  scheduler_.submit(strand, say("task"));
+  scheduler_.submitAt(1s, strand, say("delayed"));
   EXPECT_EQ(scheduler_.now(), 0s);
   EXPECT_TRUE(words_.empty());
 }
 
 TEST_F(VirtualSchedulerTest, TimeJumpsToWhatIsDueNext) {
-  const auto lane = scheduler_.makeLane();
+  const auto strand = scheduler_.makeStrand();
   std::vector<std::chrono::nanoseconds> times;
-  for (const auto due : {3s, 1s, 2s}) scheduler_.submitAt(due, lane, [&] { times.push_back(scheduler_.now()); });
+  for (const auto due : {3s, 1s, 2s}) scheduler_.submitAt(due, strand, [&] { times.push_back(scheduler_.now()); });
   scheduler_.blockUntil(10s, "the test");
   EXPECT_THAT(times, ElementsAre(1s, 2s, 3s));
   EXPECT_EQ(scheduler_.now(), 10s);
 }
 
 TEST_F(VirtualSchedulerTest, TheMainFlowGoesOnAsSoonAsItIsChosen) {
-  const auto lane = scheduler_.makeLane();
-  scheduler_.submitAt(1s, lane, say("due at the same time"));
+  const auto strand = scheduler_.makeStrand();
+  scheduler_.submitAt(1s, strand, say("due at the same time"));
   scheduler_.blockUntil(1s, "the test");
   EXPECT_TRUE(words_.empty());
   scheduler_.blockUntil(2s, "the test");
@@ -75,18 +75,18 @@ TEST_F(VirtualSchedulerTest, TheMainFlowGoesOnAsSoonAsItIsChosen) {
 }
 
 TEST_F(VirtualSchedulerTest, TasksDueAtOneTimeKeepTheOrderOfTheirSubmission) {
-  const auto lane = scheduler_.makeLane();
-  for (const char* word : {"a", "b", "c"}) scheduler_.submitAt(1s, lane, say(word));
+  const auto strand = scheduler_.makeStrand();
+  for (const char* word : {"a", "b", "c"}) scheduler_.submitAt(1s, strand, say(word));
   scheduler_.blockUntil(2s, "the test");
   EXPECT_THAT(words_, ElementsAre("a", "b", "c"));
 }
 
 TEST_F(VirtualSchedulerTest, ADueTimeThatHasComeIsNoDelay) {
-  const auto lane = scheduler_.makeLane();
+  const auto strand = scheduler_.makeStrand();
   scheduler_.blockUntil(5s, "the test");
-  scheduler_.submit(lane, say("first"));
-  scheduler_.submitAt(5s, lane, say("now"));
-  scheduler_.submitAt(1s, lane, say("in the past"));
+  scheduler_.submit(strand, say("first"));
+  scheduler_.submitAt(5s, strand, say("now"));
+  scheduler_.submitAt(1s, strand, say("in the past"));
   scheduler_.blockUntil(5s + 1ns, "the test");
   EXPECT_THAT(words_, ElementsAre("first", "now", "in the past"));
 }
@@ -103,15 +103,15 @@ TEST_F(VirtualSchedulerTest, DueTimesSaturateAndTheLastOneNeverComes) {
   EXPECT_EQ(scheduler_.after(kMax), kMax);
   EXPECT_EQ(scheduler_.after(std::chrono::nanoseconds::min()), kMax - 5ns);
 
-  scheduler_.submitAt(kMax, scheduler_.makeLane(), say("never"));
+  scheduler_.submitAt(kMax, scheduler_.makeStrand(), say("never"));
   scheduler_.blockUntil(kMax - 1ns, "the test");
   EXPECT_THROW(scheduler_.blockUntil(kMax, "the end of time"), SimulationStall);
   EXPECT_TRUE(words_.empty());
 }
 
 TEST_F(VirtualSchedulerTest, ALaneWaitsForItsTaskThatBlocksAndOthersDoNot) {
-  const auto one = scheduler_.makeLane();
-  const auto other = scheduler_.makeLane();
+  const auto one = scheduler_.makeStrand();
+  const auto other = scheduler_.makeStrand();
   scheduler_.submit(one, [&] {
     words_.push_back("one begins");
     scheduler_.blockUntil(2s, "the task");
@@ -124,8 +124,8 @@ TEST_F(VirtualSchedulerTest, ALaneWaitsForItsTaskThatBlocksAndOthersDoNot) {
 }
 
 TEST_F(VirtualSchedulerTest, AWaitThatWasBegunEarlierMayEndEarlier) {
-  const auto one = scheduler_.makeLane();
-  const auto other = scheduler_.makeLane();
+  const auto one = scheduler_.makeStrand();
+  const auto other = scheduler_.makeStrand();
   scheduler_.submit(one, [&] {
     scheduler_.blockUntil(1s, "the short wait");
     words_.push_back("short");
@@ -141,26 +141,26 @@ TEST_F(VirtualSchedulerTest, AWaitThatWasBegunEarlierMayEndEarlier) {
 }
 
 TEST_F(VirtualSchedulerTest, ATaskIsDestroyedWhenItHasRunAndBeforeTheNextStarts) {
-  const auto lane = scheduler_.makeLane();
+  const auto strand = scheduler_.makeStrand();
   struct Says {
     Words& words;
     ~Says() { words.push_back("destroyed"); }
   };
-  scheduler_.submit(lane, [this, says = std::make_unique<Says>(Says{words_})] { words_.push_back("runs"); });
+  scheduler_.submit(strand, [this, says = std::make_unique<Says>(Says{words_})] { words_.push_back("runs"); });
   words_.clear();  // of the temporary above
-  scheduler_.submit(lane, say("next"));
+  scheduler_.submit(strand, say("next"));
   scheduler_.blockUntil(1s, "the test");
   EXPECT_THAT(words_, ElementsAre("runs", "destroyed", "next"));
 }
 
 TEST_F(VirtualSchedulerTest, DroppingWhatIsDelayedLeavesWhatIsDueAndOtherLanes) {
-  const auto lane = scheduler_.makeLane();
-  const auto other = scheduler_.makeLane();
+  const auto strand = scheduler_.makeStrand();
+  const auto other = scheduler_.makeStrand();
   const auto token = std::make_shared<int>();
-  scheduler_.submit(lane, say("due"));
-  scheduler_.submitAt(1s, lane, [this, token] { words_.push_back("delayed"); });
+  scheduler_.submit(strand, say("due"));
+  scheduler_.submitAt(1s, strand, [this, token] { words_.push_back("delayed"); });
   scheduler_.submitAt(1s, other, say("of another lane"));
-  scheduler_.dropDelayed(*lane);
+  scheduler_.dropDelayed(*strand);
   EXPECT_EQ(token.use_count(), 1);
   scheduler_.blockUntil(2s, "the test");
   EXPECT_THAT(words_, ElementsAre("due", "of another lane"));
@@ -177,17 +177,17 @@ TEST_F(VirtualSchedulerTest, AStallSaysWhatWasWaitedForAndWhen) {
 }
 
 TEST_F(VirtualSchedulerTest, AWaitEndsWhenALaterTaskMakesItsConditionHold) {
-  const auto lane = scheduler_.makeLane();
+  const auto strand = scheduler_.makeStrand();
   bool lit = false;
-  scheduler_.submitAt(7s, lane, [&] { lit = true; });
+  scheduler_.submitAt(7s, strand, [&] { lit = true; });
   scheduler_.blockUntil([&] { return lit; }, "a lamp is to light up");
   EXPECT_EQ(scheduler_.now(), 7s);
 }
 
 TEST_F(VirtualSchedulerTest, AWaitWithADueTimeEndsWhenItsConditionHoldsOrWithTheTime) {
   bool lit = false;
-  const auto lane = scheduler_.makeLane();
-  scheduler_.submitAt(3s, lane, [&lit] { lit = true; });
+  const auto strand = scheduler_.makeStrand();
+  scheduler_.submitAt(3s, strand, [&lit] { lit = true; });
   scheduler_.blockUntil([&lit] { return lit; }, 2s, "a lamp is to light up");
   EXPECT_EQ(scheduler_.now(), 2s);
   EXPECT_FALSE(lit);
@@ -198,10 +198,10 @@ TEST_F(VirtualSchedulerTest, AWaitWithADueTimeEndsWhenItsConditionHoldsOrWithThe
 }
 
 TEST_F(VirtualSchedulerTest, ATaskIsToldItsLaneAndTheMainFlowHasNone) {
-  const auto first = scheduler_.makeLane();
-  const auto second = scheduler_.makeLane();
-  std::vector<std::shared_ptr<VirtualScheduler::Lane>> lanes;
-  const auto tellLane = [&] { lanes.push_back(scheduler_.currentLane()); };
+  const auto first = scheduler_.makeStrand();
+  const auto second = scheduler_.makeStrand();
+  std::vector<std::shared_ptr<VirtualScheduler::Strand>> strands;
+  const auto tellLane = [&] { strands.push_back(scheduler_.currentStrand()); };
   scheduler_.submit(first, [&] {
     tellLane();
     scheduler_.blockUntil(1s, "the task");
@@ -209,15 +209,15 @@ TEST_F(VirtualSchedulerTest, ATaskIsToldItsLaneAndTheMainFlowHasNone) {
   });
   scheduler_.submitAt(1s, second, tellLane);
   scheduler_.blockUntil(2s, "the test");
-  EXPECT_THAT(lanes, UnorderedElementsAre(first, first, second));
-  EXPECT_EQ(lanes.front(), first);
-  EXPECT_EQ(scheduler_.currentLane(), nullptr);
+  EXPECT_THAT(strands, UnorderedElementsAre(first, first, second));
+  EXPECT_EQ(strands.front(), first);
+  EXPECT_EQ(scheduler_.currentStrand(), nullptr);
 }
 
 TEST_F(VirtualSchedulerTest, WhatATaskThrowsComesOutOfTheMainFlowsWaitAndTheLaneGoesOn) {
-  const auto lane = scheduler_.makeLane();
-  scheduler_.submit(lane, [] { throw std::runtime_error("broken"); });
-  scheduler_.submit(lane, say("next"));
+  const auto strand = scheduler_.makeStrand();
+  scheduler_.submit(strand, [] { throw std::runtime_error("broken"); });
+  scheduler_.submit(strand, say("next"));
   EXPECT_THROW(scheduler_.blockUntil(1s, "the test"), std::runtime_error);
   scheduler_.blockUntil(1s, "the test");
   scheduler_.blockUntil(2s, "the test");
@@ -225,32 +225,32 @@ TEST_F(VirtualSchedulerTest, WhatATaskThrowsComesOutOfTheMainFlowsWaitAndTheLane
 }
 
 TEST_F(VirtualSchedulerTest, DiscardingDestroysPendingTasksAndThoseThatTheyLeaveBehind) {
-  const auto lane = scheduler_.makeLane();
+  const auto strand = scheduler_.makeStrand();
   const auto token = std::make_shared<int>();
   struct SubmitsWhenDestroyed {
     VirtualScheduler& scheduler;
-    std::shared_ptr<VirtualScheduler::Lane> lane;
+    std::shared_ptr<VirtualScheduler::Strand> strand;
     std::shared_ptr<int> token;
     ~SubmitsWhenDestroyed() {
-      scheduler.submit(lane, [token = token] {});
+      scheduler.submit(strand, [token = token] {});
     }
   };
-  auto leaves = std::make_unique<SubmitsWhenDestroyed>(SubmitsWhenDestroyed{scheduler_, lane, token});
+  auto leaves = std::make_unique<SubmitsWhenDestroyed>(SubmitsWhenDestroyed{scheduler_, strand, token});
   scheduler_.discardPending();  // what the temporary left
-  scheduler_.submit(lane, [token] {});
-  scheduler_.submitAt(1h, lane, [leaves = std::move(leaves)] {});
+  scheduler_.submit(strand, [token] {});
+  scheduler_.submitAt(1h, strand, [leaves = std::move(leaves)] {});
   EXPECT_EQ(token.use_count(), 3);
   scheduler_.discardPending();
   EXPECT_EQ(token.use_count(), 1);
 }
 
 TEST_F(VirtualSchedulerTest, DiscardingUnwindsATaskThatBlocks) {
-  const auto lane = scheduler_.makeLane();
+  const auto strand = scheduler_.makeStrand();
   struct Says {
     Words& words;
     ~Says() { words.push_back("unwound"); }
   };
-  scheduler_.submit(lane, [&] {
+  scheduler_.submit(strand, [&] {
     const Says says{words_};
     try {
       scheduler_.blockUntil([] { return false; }, "a lamp is to light up");
@@ -268,10 +268,11 @@ TEST_F(VirtualSchedulerTest, DiscardingUnwindsATaskThatBlocks) {
 
 TEST_F(VirtualSchedulerTest, AStallLeavesBlockedTasksToBeDiscardedWithTheScheduler) {
   auto scheduler = std::make_unique<VirtualScheduler>(std::make_shared<ScriptedChooser>());
-  const auto lane = scheduler->makeLane();
+  const auto strand = scheduler->makeStrand();
   const auto token = std::make_shared<int>();
-  scheduler->submit(
-      lane, [&scheduler = *scheduler, token] { scheduler.blockUntil([] { return false; }, "a lamp is to light up"); });
+  scheduler->submit(strand, [&scheduler = *scheduler, token] {
+    scheduler.blockUntil([] { return false; }, "a lamp is to light up");
+  });
   EXPECT_THROW(scheduler->blockUntil([] { return false; }, "another lamp is to light up"), SimulationStall);
   EXPECT_EQ(token.use_count(), 2);
   scheduler.reset();
@@ -280,28 +281,28 @@ TEST_F(VirtualSchedulerTest, AStallLeavesBlockedTasksToBeDiscardedWithTheSchedul
 
 TEST(VirtualSchedulerChoices, AChoiceThatThereIsNotIsRefused) {
   VirtualScheduler scheduler(std::make_shared<ScriptedChooser>(std::vector<std::size_t>{2}));
-  for (int i = 0; i < 2; ++i) scheduler.submit(scheduler.makeLane(), [] {});
+  for (int i = 0; i < 2; ++i) scheduler.submit(scheduler.makeStrand(), [] {});
   EXPECT_THROW(scheduler.blockUntil(1s, "the test"), std::out_of_range);
 }
 
 TEST(VirtualSchedulerChoices, WithOneThingToDoTheChooserIsNotAsked) {
   const auto chooser = std::make_shared<ScriptedChooser>();
   VirtualScheduler scheduler(chooser);
-  const auto lane = scheduler.makeLane();
-  for (int i = 0; i < 3; ++i) scheduler.submit(lane, [] {});
+  const auto strand = scheduler.makeStrand();
+  for (int i = 0; i < 3; ++i) scheduler.submit(strand, [] {});
   scheduler.blockUntil(1s, "the test");
   EXPECT_TRUE(chooser->counts.empty());
 }
 
 // Two lanes of two tasks each, and the main flow that waits for both.
-Words runOfTwoLanes(const std::shared_ptr<Chooser>& chooser) {
+Words runOfTwoLanes(const std::shared_ptr<ScheduleStrategy>& chooser) {
   VirtualScheduler scheduler(chooser);
   Words words;
   int left = 4;
-  for (const char* lane : {"a", "b"}) {
-    const auto made = scheduler.makeLane();
+  for (const char* strand : {"a", "b"}) {
+    const auto made = scheduler.makeStrand();
     for (const char* number : {"1", "2"}) {
-      scheduler.submit(made, [&words, &left, word = std::string(lane) + number] {
+      scheduler.submit(made, [&words, &left, word = std::string(strand) + number] {
         words.push_back(word);
         --left;
       });
@@ -341,8 +342,8 @@ TEST(VirtualSchedulerChoices, ReplayingPrefixesOfChoicesReachesEveryInterleaving
 TEST(VirtualSchedulerChoices, OneSeedIsOneOrderAndSeedsDiffer) {
   std::set<Words> reached;
   for (std::uint64_t seed = 0; seed < 64; ++seed) {
-    const Words words = runOfTwoLanes(std::make_shared<SeededChooser>(seed));
-    EXPECT_EQ(words, runOfTwoLanes(std::make_shared<SeededChooser>(seed)));
+    const Words words = runOfTwoLanes(std::make_shared<RandomStrategy>(seed));
+    EXPECT_EQ(words, runOfTwoLanes(std::make_shared<RandomStrategy>(seed)));
     reached.insert(words);
   }
   EXPECT_EQ(reached.size(), 6U);
@@ -351,7 +352,7 @@ TEST(VirtualSchedulerChoices, OneSeedIsOneOrderAndSeedsDiffer) {
 TEST(VirtualSchedulerChoices, OtherTasksMayRunBeforeAWaitReturnsThatNeedNotBlock) {
   VirtualScheduler scheduler(std::make_shared<ScriptedChooser>(std::vector<std::size_t>{1}));
   bool ran = false;
-  scheduler.submit(scheduler.makeLane(), [&] { ran = true; });
+  scheduler.submit(scheduler.makeStrand(), [&] { ran = true; });
   scheduler.blockUntil([] { return true; }, "nothing");
   EXPECT_TRUE(ran);
 }

@@ -10,7 +10,7 @@ constexpr Date kDateAtZero = std::chrono::sys_days(std::chrono::year(2026) / 1 /
 class VirtualSerialQueue final : public SerialQueue {
  public:
   explicit VirtualSerialQueue(std::shared_ptr<VirtualScheduler> scheduler)
-      : scheduler_(std::move(scheduler)), lane_(scheduler_->makeLane()) {}
+      : scheduler_(std::move(scheduler)), lane_(scheduler_->makeStrand()) {}
   ~VirtualSerialQueue() override { scheduler_->dropDelayed(*lane_); }
 
   void async(Task task) override { scheduler_->submit(lane_, std::move(task)); }
@@ -20,7 +20,7 @@ class VirtualSerialQueue final : public SerialQueue {
 
  private:
   std::shared_ptr<VirtualScheduler> scheduler_;
-  std::shared_ptr<VirtualScheduler::Lane> lane_;
+  std::shared_ptr<VirtualScheduler::Strand> lane_;
 };
 
 class VirtualSemaphore final : public Semaphore {

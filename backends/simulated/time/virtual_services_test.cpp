@@ -14,18 +14,18 @@ namespace {
 using namespace std::chrono_literals;
 
 // Chooses the last of what there is.
-class LastChooser final : public Chooser {
+class LastChooser final : public ScheduleStrategy {
  public:
   std::size_t choose(std::size_t count) override { return count - 1; }
 };
 
 template <class ChooserUnderTest>
-std::shared_ptr<Chooser> makeChooser() {
+std::shared_ptr<ScheduleStrategy> makeChooser() {
   return std::make_shared<ChooserUnderTest>();
 }
 template <>
-std::shared_ptr<Chooser> makeChooser<SeededChooser>() {
-  return std::make_shared<SeededChooser>(7);
+std::shared_ptr<ScheduleStrategy> makeChooser<RandomStrategy>() {
+  return std::make_shared<RandomStrategy>(7);
 }
 
 template <class ChooserUnderTest>
@@ -39,7 +39,7 @@ class VirtualUnderTest {
   std::shared_ptr<VirtualScheduler> scheduler_ = std::make_shared<VirtualScheduler>(makeChooser<ChooserUnderTest>());
 };
 
-INSTANTIATE_TYPED_TEST_SUITE_P(VirtualTimeSeeded, ConcurrencyConformance, VirtualUnderTest<SeededChooser>);
+INSTANTIATE_TYPED_TEST_SUITE_P(VirtualTimeSeeded, ConcurrencyConformance, VirtualUnderTest<RandomStrategy>);
 
 class VirtualServicesTest : public ::testing::Test {
  protected:

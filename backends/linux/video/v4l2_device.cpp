@@ -1,0 +1,266 @@
+#include "backends/linux/video/v4l2_device.h"
+
+#include "backends/linux/system/linux_error.h"
+#include "contract/message_format.h"
+
+#include <algorithm>
+#include <cerrno>
+#include <cstring>
+#include <utility>
+
+namespace quazor {
+namespace {
+
+// Drivers list some hundreds of controls or formats at most; one that goes on for ever must not hold us.
+constexpr std::uint32_t kMaxItems = 4096;
+
+// A text of the driver in a field of fixed size, which it may fill to the last byte.
+std::string codeText(std::uint32_t code) {
+  std::string text;
+  for (int shift = 0; shift < 32; shift += 8) text += static_cast<char>(code >> shift & 0x7f);
+  return text;
+}
+
+FrameInterval intervalOf(const v4l2_fract& fraction) { return {fraction.numerator, fraction.denominator}; }
+
+v4l2_ext_controls listOfOne(v4l2_ext_control& control) {
+  v4l2_ext_controls list{};
+  list.which = V4L2_CTRL_WHICH_CUR_VAL;
+  list.count = 1;
+  list.controls = &control;
+  return list;
+}
+
+bool is64Bit(const VideoControl& control) { return control.type == V4L2_CTRL_TYPE_INTEGER64; }
+
+}  // namespace
+
+std::string textOf(FrameInterval interval) {
+  return formatMessage("%@/%@ s", interval.numerator, interval.denominator);
+}
+
+bool takes(const VideoControl& control, std::int64_t value) {
+  const bool hasRange = control.type != V4L2_CTRL_TYPE_BUTTON && control.type != V4L2_CTRL_TYPE_BITMASK;
+  return !hasRange || (value >= control.lowest && value <= control.highest);
+}
+
+ControlValue valueFor(const VideoControl& control, std::int64_t value) { return {control.id, value, is64Bit(control)}; }
+
+std::shared_ptr<V4l2Device> V4l2Device::open(std::shared_ptr<V4l2Api> kernel, const std::string& path,
+                                             DiagnosticErrorPtr* error) {
+  const int descriptor = kernel->open(path);
+  if (descriptor < 0) {
+    failSystemCall(error, "open", path, -descriptor);
+    return nullptr;
+  }
+  const std::shared_ptr<V4l2Device> node(new V4l2Device(std::move(kernel), path, descriptor));
+  if (!node->call(VIDIOC_QUERYCAP, "VIDIOC_QUERYCAP", &node->capability_, error)) return nullptr;
+  node->listControls();
+  return node;
+}
+
+V4l2Device::V4l2Device(std::shared_ptr<V4l2Api> kernel, std::string path, int descriptor)
+    : kernel_(std::move(kernel)), path_(std::move(path)), descriptor_(descriptor) {}
+
+V4l2Device::~V4l2Device() { kernel_->close(descriptor_); }
+
+std::uint32_t V4l2Device::capabilities() const {
+  const bool own = (capability_.capabilities & V4L2_CAP_DEVICE_CAPS) != 0;
+  return own ? capability_.device_caps : capability_.capabilities;
+}
+
+VideoNodeKind V4l2Device::kind() const {
+  const std::uint32_t capabilities = this->capabilities();
+  if ((capabilities & V4L2_CAP_STREAMING) == 0) return VideoNodeKind::kOther;
+  if ((capabilities & V4L2_CAP_VIDEO_CAPTURE) != 0) return VideoNodeKind::kCamera;
+  return (capabilities & V4L2_CAP_META_CAPTURE) != 0 ? VideoNodeKind::kMetadata : VideoNodeKind::kOther;
+}
+
+bool V4l2Device::lockExclusive(DiagnosticErrorPtr* error) {
+  const int result = kernel_->lock(descriptor_);
+  if (result >= 0) return true;
+  if (result == -EWOULDBLOCK) {
+    failLinux(error, LinuxErrorCode::kBusy, path_ + " is in use by another process of this kind.");
+  } else {
+    failSystemCall(error, "flock", path_, -result);
+  }
+  return false;
+}
+
+std::vector<VideoFormat> V4l2Device::formats() const {
+  std::vector<VideoFormat> formats;
+  const bool isCamera = kind() == VideoNodeKind::kCamera;
+  for (std::uint32_t index = 0; index < kMaxItems; ++index) {
+    v4l2_fmtdesc description{};
+    description.index = index;
+    description.type = isCamera ? V4L2_BUF_TYPE_VIDEO_CAPTURE : V4L2_BUF_TYPE_META_CAPTURE;
+    if (call(VIDIOC_ENUM_FMT, &description) != 0) break;
+    VideoFormat format{index, codeText(description.pixelformat), fixedText(description.description), {}};
+    if (isCamera) format.sizes = sizesOf(description.pixelformat);
+    formats.push_back(std::move(format));
+  }
+  return formats;
+}
+
+std::vector<FrameSize> V4l2Device::sizesOf(std::uint32_t code) const {
+  std::vector<FrameSize> sizes;
+  for (std::uint32_t index = 0; index < kMaxItems; ++index) {
+    v4l2_frmsizeenum entry{};
+    entry.index = index;
+    entry.pixel_format = code;
+    if (call(VIDIOC_ENUM_FRAMESIZES, &entry) != 0) break;
+    const bool discrete = entry.type == V4L2_FRMSIZE_TYPE_DISCRETE;
+    FrameSize size;
+    size.width = discrete ? entry.discrete.width : entry.stepwise.min_width;
+    size.height = discrete ? entry.discrete.height : entry.stepwise.min_height;
+    size.highestWidth = discrete ? size.width : entry.stepwise.max_width;
+    size.highestHeight = discrete ? size.height : entry.stepwise.max_height;
+    listIntervals(code, size);
+    sizes.push_back(std::move(size));
+    if (!discrete) break;  // such a driver has this one entry
+  }
+  return sizes;
+}
+
+// Of a range of sizes, those of the lowest.
+void V4l2Device::listIntervals(std::uint32_t code, FrameSize& size) const {
+  for (std::uint32_t index = 0; index < kMaxItems; ++index) {
+    v4l2_frmivalenum entry{};
+    entry.index = index;
+    entry.pixel_format = code;
+    entry.width = size.width;
+    entry.height = size.height;
+    if (call(VIDIOC_ENUM_FRAMEINTERVALS, &entry) != 0) return;
+    if (entry.type == V4L2_FRMIVAL_TYPE_DISCRETE) {
+      size.intervals.push_back(intervalOf(entry.discrete));
+      continue;
+    }
+    size.intervals = {intervalOf(entry.stepwise.min), intervalOf(entry.stepwise.max)};
+    size.anyIntervalBetween = true;
+    return;
+  }
+}
+
+bool V4l2Device::setFormat(std::uint32_t index, std::uint32_t width, std::uint32_t height, DiagnosticErrorPtr* error) {
+  v4l2_fmtdesc description{};
+  description.index = index;
+  description.type = V4L2_BUF_TYPE_VIDEO_CAPTURE;
+  const int result = call(VIDIOC_ENUM_FMT, &description);
+  if (result == EINVAL) {
+    failLinux(error, LinuxErrorCode::kNotSupported, formatMessage("%@ has no format of index %@.", path_, index));
+    return false;
+  }
+  if (result != 0) {
+    failSystemCall(error, "VIDIOC_ENUM_FMT", path_, result);
+    return false;
+  }
+  v4l2_format wanted{};
+  wanted.type = V4L2_BUF_TYPE_VIDEO_CAPTURE;
+  wanted.fmt.pix.width = width;
+  wanted.fmt.pix.height = height;
+  wanted.fmt.pix.pixelformat = description.pixelformat;
+  wanted.fmt.pix.field = V4L2_FIELD_ANY;
+  // The answer to the second may differ from that to the first, when something else of the device has changed.
+  const auto isGranted = [&](const v4l2_pix_format& given) {
+    if (given.width == width && given.height == height && given.pixelformat == description.pixelformat) return true;
+    failLinux(error, LinuxErrorCode::kNotSupported,
+              formatMessage("%@: format %@ (%@) of %@ x %@ is not to be had; the driver offers %@ of %@ x %@.", path_,
+                            index, codeText(description.pixelformat), width, height, codeText(given.pixelformat),
+                            given.width, given.height));
+    return false;
+  };
+  v4l2_format offered = wanted;
+  return call(VIDIOC_TRY_FMT, "VIDIOC_TRY_FMT", &offered, error) && isGranted(offered.fmt.pix) &&
+         call(VIDIOC_S_FMT, "VIDIOC_S_FMT", &wanted, error) && isGranted(wanted.fmt.pix);
+}
+
+std::optional<FrameInterval> V4l2Device::interval(DiagnosticErrorPtr* error) const {
+  v4l2_streamparm parameters{};
+  parameters.type = V4L2_BUF_TYPE_VIDEO_CAPTURE;
+  if (!call(VIDIOC_G_PARM, "VIDIOC_G_PARM", &parameters, error)) return std::nullopt;
+  return intervalOf(parameters.parm.capture.timeperframe);
+}
+
+std::optional<FrameInterval> V4l2Device::setInterval(FrameInterval wanted, DiagnosticErrorPtr* error) {
+  v4l2_streamparm parameters{};
+  parameters.type = V4L2_BUF_TYPE_VIDEO_CAPTURE;
+  parameters.parm.capture.timeperframe = {wanted.numerator, wanted.denominator};
+  if (!call(VIDIOC_S_PARM, "VIDIOC_S_PARM", &parameters, error)) return std::nullopt;
+  return intervalOf(parameters.parm.capture.timeperframe);
+}
+
+void V4l2Device::listControls() {
+  v4l2_query_ext_ctrl query{};
+  for (std::uint32_t i = 0; i < kMaxItems; ++i) {
+    query.id |= V4L2_CTRL_FLAG_NEXT_CTRL;
+    if (call(VIDIOC_QUERY_EXT_CTRL, &query) != 0) return;
+    const bool isHeading = query.type == V4L2_CTRL_TYPE_CTRL_CLASS;
+    if (isHeading || (query.flags & V4L2_CTRL_FLAG_DISABLED) != 0) continue;
+    controls_.push_back(
+        {query.id, query.type, fixedText(query.name), query.minimum, query.maximum, query.default_value});
+  }
+}
+
+const VideoControl* V4l2Device::control(std::string_view name, DiagnosticErrorPtr* error) const {
+  const auto found = std::ranges::find(controls_, name, &VideoControl::name);
+  if (found != controls_.end()) return &*found;
+  failLinux(error, LinuxErrorCode::kNotSupported, formatMessage("%@ has no control \"%@\".", path_, name));
+  return nullptr;
+}
+
+const VideoControl* V4l2Device::controlOfId(std::uint32_t id) const {
+  const auto found = std::ranges::find(controls_, id, &VideoControl::id);
+  return found == controls_.end() ? nullptr : &*found;
+}
+
+std::optional<std::int64_t> V4l2Device::read(const VideoControl& control, DiagnosticErrorPtr* error) const {
+  v4l2_ext_control entry{};
+  entry.id = control.id;
+  v4l2_ext_controls list = listOfOne(entry);
+  const int result = call(VIDIOC_G_EXT_CTRLS, &list);
+  if (result != 0) {
+    failSystemCall(error, "VIDIOC_G_EXT_CTRLS of \"" + control.name + "\"", path_, result);
+    return std::nullopt;
+  }
+  return is64Bit(control) ? std::int64_t{entry.value64} : std::int64_t{entry.value};
+}
+
+bool V4l2Device::set(const VideoControl& control, std::int64_t value, DiagnosticErrorPtr* error) {
+  if (!takes(control, value)) {
+    failLinux(error, LinuxErrorCode::kBadValue,
+              formatMessage("%@: the control \"%@\" takes %@ to %@, not %@.", path_, control.name, control.lowest,
+                            control.highest, value));
+    return false;
+  }
+  v4l2_ext_control entry{};
+  entry.id = control.id;
+  if (is64Bit(control)) {
+    entry.value64 = value;
+  } else {
+    entry.value = static_cast<std::int32_t>(value);
+  }
+  v4l2_ext_controls list = listOfOne(entry);
+  const int result = call(VIDIOC_S_EXT_CTRLS, &list);
+  if (result != 0) failSystemCall(error, "VIDIOC_S_EXT_CTRLS of \"" + control.name + "\"", path_, result);
+  return result == 0;
+}
+
+bool V4l2Device::set(const std::vector<ControlSetting>& settings, DiagnosticErrorPtr* error) {
+  return std::ranges::all_of(settings, [&](const ControlSetting& setting) {
+    const VideoControl* const one = control(setting.control, error);
+    return one != nullptr && set(*one, setting.value, error);
+  });
+}
+
+int V4l2Device::call(unsigned long request, void* argument) const {
+  const int result = kernel_->ioctl(descriptor_, request, argument);
+  return result < 0 ? -result : 0;
+}
+
+bool V4l2Device::call(unsigned long request, std::string_view name, void* argument, DiagnosticErrorPtr* error) const {
+  const int result = call(request, argument);
+  if (result != 0) failSystemCall(error, name, path_, result);
+  return result == 0;
+}
+
+}  // namespace quazor

@@ -1,0 +1,242 @@
+#include "backends/linux/video/v4l2_device_info.h"
+
+#include "backends/linux/capture/linux_capture_for_tests.h"
+#include "backends/linux/video/v4l2_device.h"
+
+#include <cerrno>
+
+namespace quazor {
+namespace {
+
+using Kernel = std::shared_ptr<FakeV4l2Api>;
+
+std::vector<std::string> namesOf(const std::vector<V4l2DeviceInfo>& nodes) {
+  std::vector<std::string> names;
+  for (const V4l2DeviceInfo& node : nodes) names.push_back(node.path.filename().string());
+  return names;
+}
+
+TEST(VideoNodesTest, AMachineWithoutCamerasHasNone) {
+  const Kernel kernel = std::make_shared<FakeV4l2Api>();
+  EXPECT_TRUE(videoNodes(kernel, kernel->roots()).empty());
+}
+
+TEST(VideoNodesTest, NodesComeByTheirNumbersAndOtherThingsAreNone) {
+  const Kernel kernel = std::make_shared<FakeV4l2Api>();
+  for (const int number : {10, 2, 0}) kernel->add(number, fakeCamera("fake:0"));
+  for (const char* name : {"v4l-subdev0", "radio0", "videoX", "video1b", "video"}) {
+    std::filesystem::create_directories(kernel->roots().sysfs / "class" / "video4linux" / name);
+  }
+  EXPECT_EQ(namesOf(videoNodes(kernel, kernel->roots())), (std::vector<std::string>{"video0", "video2", "video10"}));
+}
+
+TEST(VideoNodesTest, ANodeTellsWhatItIsOrWhyItCannotBeOpened) {
+  const Kernel kernel = std::make_shared<FakeV4l2Api>();
+  kernel->add(0, fakeCamera("fake:0"));
+  kernel->add(1, fakeMetadata("fake:0"));
+  FakeNode output = fakeCamera("fake:0");
+  output.capabilities = V4L2_CAP_VIDEO_OUTPUT | V4L2_CAP_STREAMING;
+  kernel->add(2, output);
+  FakeNode reading = fakeCamera("fake:0");
+  reading.capabilities = V4L2_CAP_VIDEO_CAPTURE | V4L2_CAP_READWRITE;
+  kernel->add(3, reading);
+  FakeNode closed = fakeCamera("fake:0");
+  closed.openProblem = EACCES;
+  const std::string path = kernel->add(4, closed);
+  const std::vector<V4l2DeviceInfo> nodes = videoNodes(kernel, kernel->roots());
+  ASSERT_EQ(nodes.size(), 5U);
+  EXPECT_EQ(nodes[0].kind, VideoNodeKind::kCamera);
+  EXPECT_EQ(nodes[0].capabilities, std::uint32_t{V4L2_CAP_VIDEO_CAPTURE | V4L2_CAP_STREAMING});
+  EXPECT_EQ(nodes[0].systemName, "fake camera node");
+  EXPECT_EQ(nodes[1].kind, VideoNodeKind::kMetadata);
+  EXPECT_EQ(nodes[2].kind, VideoNodeKind::kOther);
+  EXPECT_EQ(nodes[3].kind, VideoNodeKind::kOther);
+  ASSERT_NE(nodes[4].problem, nullptr);
+  EXPECT_EQ(textOf(nodes[4]), path + " (open on " + path + " failed: Permission denied (EACCES))");
+  EXPECT_FALSE(detailsOf(kernel, nodes[4], nullptr));
+  EXPECT_TRUE(kernel->isIdle());
+}
+
+TEST(VideoNodesTest, ADriverThatDoesNotAnswerIsToldAndClosed) {
+  const Kernel kernel = std::make_shared<FakeV4l2Api>();
+  const std::string path = kernel->add(0, fakeCamera("fake:0"));
+  kernel->failNext(path, VIDIOC_QUERYCAP, ENOTTY);
+  EXPECT_EQ(videoNodes(kernel, kernel->roots())[0].problem->localizedDescription(),
+            "VIDIOC_QUERYCAP on " + path + " failed: Inappropriate ioctl for device (ENOTTY)");
+  EXPECT_TRUE(kernel->isIdle());
+}
+
+TEST(VideoNodesTest, DetailsAreFormatsWithSizesAndIntervalsAndControls) {
+  const Kernel kernel = std::make_shared<FakeV4l2Api>();
+  FakeNode camera = fakeCamera("fake:0");
+  camera.controls = {{V4L2_CID_USER_CLASS, "User Controls", 0, 0, 0, V4L2_CTRL_TYPE_CTRL_CLASS},
+                     {V4L2_CID_BRIGHTNESS, "Brightness", -64, 64, 12},
+                     {V4L2_CID_CONTRAST, "Contrast", 0, 9, 1, V4L2_CTRL_TYPE_INTEGER, V4L2_CTRL_FLAG_DISABLED}};
+  kernel->add(0, camera);
+  const auto details = detailsOf(kernel, videoNodes(kernel, kernel->roots())[0], nullptr);
+  ASSERT_TRUE(details);
+  ASSERT_EQ(details->formats.size(), 2U);
+  const VideoFormat& grey = details->formats[1];
+  EXPECT_EQ(grey.index, 1U);
+  EXPECT_EQ(grey.code, "GREY");
+  EXPECT_EQ(grey.text, "8-bit grey");
+  ASSERT_EQ(grey.sizes.size(), 2U);
+  EXPECT_EQ(grey.sizes[1].width, 640U);
+  EXPECT_EQ(grey.sizes[1].highestHeight, 480U);
+  EXPECT_EQ(grey.sizes[1].intervals, (std::vector<FrameInterval>{{1, 5}, {1, 25}}));
+  EXPECT_FALSE(grey.sizes[1].anyIntervalBetween);
+  ASSERT_EQ(details->controls.size(), 1U);
+  EXPECT_EQ(details->controls[0].name, "Brightness");
+  EXPECT_EQ(details->controls[0].lowest, -64);
+  EXPECT_EQ(details->controls[0].highest, 64);
+  EXPECT_EQ(details->controls[0].usual, 12);
+}
+
+// A driver that answers with ranges.
+class RangesKernel final : public FakeV4l2Api {
+ public:
+  int ioctl(int descriptor, unsigned long request, void* argument) override {
+    if (request == VIDIOC_ENUM_FRAMESIZES) {
+      auto& entry = *static_cast<v4l2_frmsizeenum*>(argument);
+      entry.type = V4L2_FRMSIZE_TYPE_STEPWISE;
+      entry.stepwise = {16, 1920, 2, 8, 1080, 4};
+      return entry.index == 0 ? 0 : -EINVAL;
+    }
+    if (request == VIDIOC_ENUM_FRAMEINTERVALS) {
+      auto& entry = *static_cast<v4l2_frmivalenum*>(argument);
+      entry.type = V4L2_FRMIVAL_TYPE_CONTINUOUS;
+      entry.stepwise = {{1, 60}, {1, 1}, {1, 1}};
+      return 0;
+    }
+    return FakeV4l2Api::ioctl(descriptor, request, argument);
+  }
+};
+
+TEST(VideoNodesTest, RangesOfSizesAndIntervalsAreToldByTheirEnds) {
+  const auto kernel = std::make_shared<RangesKernel>();
+  kernel->add(0, fakeCamera("fake:0"));
+  const auto details = detailsOf(kernel, videoNodes(kernel, kernel->roots())[0], nullptr);
+  ASSERT_TRUE(details);
+  ASSERT_EQ(details->formats[0].sizes.size(), 1U);
+  const FrameSize& size = details->formats[0].sizes[0];
+  EXPECT_EQ(size.width, 16U);
+  EXPECT_EQ(size.highestWidth, 1920U);
+  EXPECT_EQ(size.height, 8U);
+  EXPECT_EQ(size.highestHeight, 1080U);
+  EXPECT_EQ(size.intervals, (std::vector<FrameInterval>{{1, 60}, {1, 1}}));
+  EXPECT_TRUE(size.anyIntervalBetween);
+}
+
+class FindingTest : public testing::Test {
+ protected:
+  FindingTest() {
+    kernel_->add(0, fakeCamera("fake:0"));
+    kernel_->add(1, fakeCamera("fake:1"));
+    kernel_->add(2, fakeMetadata("fake:0"));
+    nodes_ = videoNodes(kernel_, kernel_->roots());
+  }
+  std::string find(const VideoNodeMatch& match) {
+    std::string text = outcome([&](auto* error) {
+      found_ = findVideoNode(nodes_, VideoNodeKind::kCamera, match, "Port", error);
+      return found_;
+    });
+    const std::string dev = kernel_->roots().dev.string();
+    for (std::size_t at = text.find(dev); at != std::string::npos; at = text.find(dev)) {
+      text.replace(at, dev.size(), "/dev");
+    }
+    return text;
+  }
+
+  const Kernel kernel_ = std::make_shared<FakeV4l2Api>();
+  std::vector<V4l2DeviceInfo> nodes_;
+  std::optional<V4l2DeviceInfo> found_;
+};
+
+TEST_F(FindingTest, OneIsFoundByAnyOfWhatItsDriverSays) {
+  EXPECT_EQ(find({"fake", "fake camera", "fake:1"}), "done");
+  EXPECT_EQ(found_->path.filename(), "video1");
+  EXPECT_EQ(find({{}, {}, "fake:0"}), "done") << "the metadata node at the same place is no camera";
+}
+
+TEST_F(FindingTest, NoneOrSeveralAreToldWithWhatThereIs) {
+  const std::string all =
+      "/dev/video0 (driver fake, card fake camera, bus fake:0), /dev/video1 (driver fake, card fake camera, bus "
+      "fake:1)";
+  EXPECT_EQ(find({"uvc", {}, "fake:1"}), "2 Port: no camera is driver uvc, bus fake:1; there are " + all + ".");
+  EXPECT_EQ(find({{}, "fake camera", {}}), "3 Port: more than one camera is card fake camera; there are " + all + ".");
+  EXPECT_EQ(find({}), "3 Port: more than one camera is any; there are " + all + ".");
+  nodes_.clear();
+  EXPECT_EQ(find({}), "2 Port: no camera is any; there is none at all.");
+}
+
+TEST_F(FindingTest, WhatCannotBeOpenedIsNamedForItMayBeTheOne) {
+  FakeNode closed = fakeCamera("fake:3");
+  closed.openProblem = EACCES;
+  kernel_->add(3, closed);
+  nodes_ = videoNodes(kernel_, kernel_->roots());
+  nodes_.erase(nodes_.begin(), nodes_.begin() + 3);
+  EXPECT_EQ(find({"uvc", {}, {}}),
+            "4 Port: no camera is driver uvc; there is none at all; what is behind these is not known: /dev/video3 "
+            "(open on /dev/video3 failed: Permission denied (EACCES)).");
+  closed.openProblem = ENXIO;
+  kernel_->add(3, closed);
+  nodes_ = videoNodes(kernel_, kernel_->roots());
+  EXPECT_EQ(find({"uvc", {}, {}}).substr(0, 2), "2 ");
+}
+
+TEST(OpenedVideoNodeTest, ControlsKeepTheirRangesAndTheirWidth) {
+  const Kernel kernel = std::make_shared<FakeV4l2Api>();
+  FakeNode camera = fakeCamera("fake:0");
+  camera.controls = {{1, "Narrow", -5, 5, 0},
+                     {2, "Wide", 0, INT64_MAX, 0, V4L2_CTRL_TYPE_INTEGER64},
+                     {3, "Button", 0, 0, 0, V4L2_CTRL_TYPE_BUTTON}};
+  const std::string path = kernel->add(0, camera);
+  const auto node = V4l2Device::open(kernel, path, nullptr);
+  const auto set = [&](const char* name, std::int64_t value) {
+    return outcome([&](auto* error) { return node->set(*node->control(name, nullptr), value, error); });
+  };
+  EXPECT_EQ(set("Narrow", -5), "done");
+  EXPECT_EQ(node->read(*node->control("Narrow", nullptr), nullptr), -5);
+  EXPECT_EQ(set("Narrow", 6), "6 " + path + ": the control \"Narrow\" takes -5 to 5, not 6.");
+  EXPECT_EQ(set("Narrow", -6), "6 " + path + ": the control \"Narrow\" takes -5 to 5, not -6.");
+  EXPECT_EQ(set("Wide", 1LL << 40), "done");
+  EXPECT_EQ(node->read(*node->control("Wide", nullptr), nullptr), 1LL << 40);
+  EXPECT_EQ(set("Button", 1), "done") << "a button has no range";
+  EXPECT_TRUE(valueFor(*node->control("Wide", nullptr), 1).is64Bit);
+  EXPECT_FALSE(valueFor(*node->control("Narrow", nullptr), 1).is64Bit);
+}
+
+TEST(OpenedVideoNodeTest, AFormatThatTheDriverChangesAsItIsSetIsRefused) {
+  class ChangingKernel final : public FakeV4l2Api {
+   public:
+    int ioctl(int descriptor, unsigned long request, void* argument) override {
+      const int result = FakeV4l2Api::ioctl(descriptor, request, argument);
+      if (request == VIDIOC_S_FMT) static_cast<v4l2_format*>(argument)->fmt.pix.height = 352;
+      return result;
+    }
+  };
+  const auto kernel = std::make_shared<ChangingKernel>();
+  const std::string path = kernel->add(0, fakeCamera("fake:0"));
+  const auto node = V4l2Device::open(kernel, path, nullptr);
+  EXPECT_EQ(outcome([&](auto* error) { return node->setFormat(1, 640, 360, error); }),
+            "5 " + path + ": format 1 (GREY) of 640 x 360 is not to be had; the driver offers GREY of 640 x 352.");
+}
+
+TEST(OpenedVideoNodeTest, ADriverWithoutCapabilitiesOfItsNodesIsTakenByTheDevices) {
+  class OldKernel final : public FakeV4l2Api {
+   public:
+    int ioctl(int descriptor, unsigned long request, void* argument) override {
+      const int result = FakeV4l2Api::ioctl(descriptor, request, argument);
+      if (request != VIDIOC_QUERYCAP) return result;
+      auto& capability = *static_cast<v4l2_capability*>(argument);
+      capability.capabilities = V4L2_CAP_META_CAPTURE | V4L2_CAP_STREAMING;
+      return result;
+    }
+  };
+  const auto kernel = std::make_shared<OldKernel>();
+  const auto node = V4l2Device::open(kernel, kernel->add(0, fakeCamera("fake:0")), nullptr);
+  EXPECT_EQ(node->kind(), VideoNodeKind::kMetadata);
+}
+
+}  // namespace
+}  // namespace quazor

@@ -1,0 +1,71 @@
+#include "host/command/failed_only.h"
+
+#include "host/device/phone.h"
+#include "host/record/previous_run.h"
+#include "host/record/record_file.h"
+
+#include <algorithm>
+#include <utility>
+
+namespace quazor {
+
+namespace {
+
+OrderedMap<Value> valuesOf(const std::vector<ResolvedParameter>& parameters) {
+  OrderedMap<Value> values;
+  for (const ResolvedParameter& one : parameters) {
+    if (one.value) values.set(one.name, *one.value);
+  }
+  return values;
+}
+
+void refuseFailedPlugins(const RecordedRun& run) {
+  for (const DiagnosticRecord& one : run.records) {
+    if (!one.experimentName.empty()) continue;  // it is no plug-in
+    throw CommandError(
+        ExitCode::kCannotRead,
+        "the plug-in " + one.name +
+            " could not be loaded in that run, so what it holds was not run; name what is to be run, or give "
+            "--all");
+  }
+}
+
+// The parameters of a run's diagnostics of these names; what was not begun is not among them.
+Profile recordedProfile(const std::filesystem::path& record, const RecordedRun& run,
+                        const std::vector<std::string>& names) {
+  Profile profile{record, {}};
+  profile.kind = "record";
+  profile.mayNameOthers = true;
+  for (const DiagnosticRecord& one : run.records) {
+    if (std::find(names.begin(), names.end(), one.name) == names.end()) continue;
+    profile.entries.push_back({one.name, valuesOf(one.parameters.experiment), valuesOf(one.parameters.analysis)});
+  }
+  return profile;
+}
+
+}  // namespace
+
+Options optionsToRunAgain(Options options) {
+  const std::filesystem::path record = options.failedOf.empty() ? previousRunFile() : options.failedOf;
+  if (record.empty() || (options.failedOf.empty() && !std::filesystem::exists(record))) {
+    throw CommandError(ExitCode::kCannotRead, "there is no record of a last run; --of RECORD names one");
+  }
+  const RecordedRun run = runIn(record);
+  refuseFailedPlugins(run);
+  options.names = failedNames(run);
+  options.recorded = recordedProfile(record, run, options.names);
+  if (options.plugins.empty()) options.plugins.assign(run.began.plugins.begin(), run.began.plugins.end());
+  if (options.phone.empty()) {
+    options.phone = run.began.phone;
+    if (bindingNamed(options.phone) && (options.realTime || options.seed != 0)) {
+      throw CommandError(ExitCode::kUsage, "--seed and --realtime are for simulated phones; that run's was '" +
+                                               run.began.phone + "'; --phone chooses another");
+    }
+  }
+  // What the installed profile set then is in the record; it may have changed since, or have been left out.
+  const bool allRecorded = options.recorded->entries.size() == options.names.size();
+  if (options.profile.empty() && allRecorded) options.withoutProfile = true;
+  return options;
+}
+
+}  // namespace quazor

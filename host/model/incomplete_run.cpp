@@ -1,0 +1,45 @@
+#include "host/model/incomplete_run.h"
+
+#include "host/error/host_error.h"
+
+#include <cstddef>
+#include <cstdint>
+#include <map>
+
+namespace quazor {
+
+namespace {
+
+bool saysItWasInterrupted(const DiagnosticRecord& record) {
+  return record.error != nullptr && record.error->domain() == QuazorHostErrorDomain &&
+         record.error->code() == static_cast<std::int64_t>(HostErrorCode::kInterrupted);
+}
+
+}  // namespace
+
+Unfinished unfinishedOf(const RunStarted& run, const std::vector<DiagnosticRecord>& records,
+                        const std::optional<std::string>& interrupted) {
+  Unfinished unfinished;
+  std::map<std::string, std::size_t> begun;
+  for (const DiagnosticRecord& record : records) ++begun[record.name];
+  if (interrupted && (records.empty() || !saysItWasInterrupted(records.back()))) {
+    unfinished.interrupted = *interrupted;
+    ++begun[*interrupted];
+  }
+  for (const std::string& name : run.names) {
+    std::size_t& left = begun[name];
+    if (left == 0) {
+      unfinished.neverRun.push_back(name);
+    } else {
+      --left;
+    }
+  }
+  return unfinished;
+}
+
+DiagnosticErrorPtr interruptionOf(const std::string& interrupted) {
+  return hostError(HostErrorCode::kInterrupted, interrupted.empty() ? "the run was interrupted between two"
+                                                                    : "the run was interrupted while it was running");
+}
+
+}  // namespace quazor

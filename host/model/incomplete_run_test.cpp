@@ -1,0 +1,72 @@
+#include "host/model/incomplete_run.h"
+
+#include "host/error/host_error.h"
+#include "host/testing/test_records.h"
+
+#include <gmock/gmock.h>
+#include <gtest/gtest.h>
+
+namespace quazor {
+namespace {
+
+using testing::ElementsAre;
+using testing::IsEmpty;
+
+RunStarted runOf(std::vector<std::string> names) {
+  RunStarted run;
+  run.names = std::move(names);
+  return run;
+}
+
+TEST(Unfinished, IsNothingWhenAllHaveRecords) {
+  const Unfinished unfinished =
+      unfinishedOf(runOf({"A", "B"}), {recordOf("A", Verdict::kPass), recordOf("B", Verdict::kError)}, {});
+  EXPECT_EQ(unfinished.interrupted, std::nullopt);
+  EXPECT_THAT(unfinished.neverRun, IsEmpty());
+}
+
+TEST(Unfinished, IsWhatWasInterruptedAndWhatCameBehind) {
+  const Unfinished unfinished = unfinishedOf(runOf({"A", "B", "C", "D"}), {recordOf("A", Verdict::kPass)}, "B");
+  EXPECT_EQ(unfinished.interrupted, "B");
+  EXPECT_THAT(unfinished.neverRun, ElementsAre("C", "D"));
+}
+
+TEST(Unfinished, TellsAnInterruptBetweenTwo) {
+  const Unfinished unfinished = unfinishedOf(runOf({"A", "B"}), {recordOf("A", Verdict::kPass)}, "");
+  EXPECT_EQ(unfinished.interrupted, "");
+  EXPECT_THAT(unfinished.neverRun, ElementsAre("B"));
+  EXPECT_EQ(unfinishedOf(runOf({"A"}), {}, "").interrupted, "");
+}
+
+TEST(Unfinished, LeavesOutAnInterruptedOneThatHasARecordOfIt) {
+  DiagnosticRecord record = recordOf("B", Verdict::kError);
+  record.error = hostError(HostErrorCode::kInterrupted, "it was interrupted");
+  const Unfinished unfinished = unfinishedOf(runOf({"A", "B", "C"}), {recordOf("A", Verdict::kPass), record}, "B");
+  EXPECT_EQ(unfinished.interrupted, std::nullopt);
+  EXPECT_THAT(unfinished.neverRun, ElementsAre("C"));
+}
+
+TEST(Unfinished, TakesOnlyTheHostsOwnErrorForARecordOfIt) {
+  DiagnosticRecord record = recordOf("A", Verdict::kError);
+  const auto code = static_cast<std::int64_t>(HostErrorCode::kInterrupted);
+  record.error = errorWithMessage("Domain", code, "another's", nullptr);
+  EXPECT_EQ(unfinishedOf(runOf({"A", "B"}), {record}, "B").interrupted, "B");
+  record.error = hostError(HostErrorCode::kCrashed, "it crashed");
+  EXPECT_EQ(unfinishedOf(runOf({"A", "B"}), {record}, "B").interrupted, "B");
+}
+
+TEST(Unfinished, CountsWhatIsRunSeveralTimes) {
+  const Unfinished unfinished = unfinishedOf(runOf({"A", "A", "A", "A"}), {recordOf("A", Verdict::kPass)}, "A");
+  EXPECT_THAT(unfinished.neverRun, ElementsAre("A", "A"));
+}
+
+TEST(Interruption, IsTheHostsError) {
+  const DiagnosticErrorPtr error = interruptionOf("A");
+  EXPECT_EQ(error->domain(), QuazorHostErrorDomain);
+  EXPECT_EQ(error->code(), static_cast<std::int64_t>(HostErrorCode::kInterrupted));
+  EXPECT_EQ(error->localizedDescription(), "the run was interrupted while it was running");
+  EXPECT_EQ(interruptionOf("")->localizedDescription(), "the run was interrupted between two");
+}
+
+}  // namespace
+}  // namespace quazor

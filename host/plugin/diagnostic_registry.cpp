@@ -1,0 +1,169 @@
+#include "host/plugin/diagnostic_registry.h"
+
+#include "base/text/nearest_name.h"
+#include "host/error/exit_code.h"
+#include "host/error/host_error.h"
+#include "host/plugin/null_platform.h"
+
+#include <fnmatch.h>
+
+#include <algorithm>
+#include <iterator>
+#include <string_view>
+#include <utility>
+
+namespace quazor {
+
+namespace {
+
+std::vector<std::string> diagnosticsWith(const QZLab& lab, const std::string& experiment) {
+  std::vector<std::string> names;
+  for (const QZLab::Registration& one : lab.registrations()) {
+    if (one.kind == QZLab::Kind::kDiagnostic && one.experimentName == experiment) names.push_back(one.name);
+  }
+  return names;
+}
+
+template <class Test>
+std::vector<Diagnostic> thoseThat(const std::vector<Diagnostic>& diagnostics, Test test) {
+  std::vector<Diagnostic> those;
+  std::copy_if(diagnostics.begin(), diagnostics.end(), std::back_inserter(those), test);
+  return those;
+}
+
+bool isWanted(const Diagnostic& one, Wanted wanted) {
+  switch (wanted) {
+    case Wanted::kDiagnostics: return !one.experimentOnly;
+    case Wanted::kExperiments: return one.experimentOnly;
+    case Wanted::kDescribable: break;
+  }
+  return one.usedBy.empty();
+}
+
+// What a name of its own reaches; a pattern that fits nothing else does too.
+std::vector<Diagnostic> reachable(const std::vector<Diagnostic>& catalogue, Wanted wanted) {
+  return wanted == Wanted::kDescribable ? catalogue : allOf(catalogue, wanted);
+}
+
+std::string_view nounOf(Wanted wanted) {
+  switch (wanted) {
+    case Wanted::kDiagnostics: return "diagnostic";
+    case Wanted::kExperiments: return "experiment";
+    case Wanted::kDescribable: break;
+  }
+  return "diagnostic or experiment";
+}
+
+[[noreturn]] void refuseName(const std::vector<Diagnostic>& catalogue, Wanted wanted, const std::string& name) {
+  const std::string quoted = "'" + name + "'";
+  const std::string noun(nounOf(wanted));
+  const auto other = std::find_if(catalogue.begin(), catalogue.end(),
+                                  [&name](const Diagnostic& one) { return matchesName(name, one.name); });
+  if (other != catalogue.end()) {
+    const std::string rest =
+        other->experimentOnly
+            ? "an experiment, which has no limits to be judged by; 'quazor experiment " + other->name + "' runs it"
+            : "a diagnostic; 'quazor run " + other->name + "' runs it, and 'quazor experiment " +
+                  other->experimentName + "' runs its experiment alone";
+    const std::string subject = isPattern(name) ? "no " + noun + " matches " + quoted + ", but " + other->name : quoted;
+    throw CommandError(ExitCode::kUsage, subject + " is " + rest);
+  }
+  if (isPattern(name)) throw CommandError(ExitCode::kUsage, "no " + noun + " matches " + quoted);
+  throw CommandError(ExitCode::kUsage,
+                     "there is no " + noun + " " + quoted + didYouMean(name, namesOf(reachable(catalogue, wanted))));
+}
+
+}  // namespace
+
+std::vector<Diagnostic> catalogueOf(const QZLab& lab) {
+  std::vector<Diagnostic> catalogue;
+  for (const QZLab::Registration& one : lab.registrations()) {
+    if (one.kind != QZLab::Kind::kDiagnostic) continue;
+    const QZLab::Registration* experiment = lab.find(QZLab::Kind::kExperiment, one.experimentName);
+    const QZLab::Registration* analysis = lab.find(QZLab::Kind::kAnalysis, one.analysisName);
+    if (experiment == nullptr || analysis == nullptr) continue;
+    catalogue.push_back({one.name, one.summary, one.experimentName, one.analysisName, experiment->makeExperiment,
+                         analysis->makeAnalysis});
+  }
+  for (const QZLab::Registration& one : lab.registrations()) {
+    if (one.kind != QZLab::Kind::kExperiment) continue;
+    catalogue.push_back(
+        {one.name, {}, one.name, {}, one.makeExperiment, nullptr, true, diagnosticsWith(lab, one.name)});
+  }
+  return catalogue;
+}
+
+DiagnosticDescription describeDiagnostic(const Diagnostic& diagnostic) {
+  DiagnosticDescription description;
+  installPlatform(nullPlatform());
+  callPlugin("describing " + diagnostic.experimentName, &description.error, [&](DiagnosticErrorPtr* error) {
+    const std::shared_ptr<QZExperiment> experiment = diagnostic.makeExperiment();
+    if (experiment == nullptr) {
+      *error = hostError(HostErrorCode::kNothingMade, "the factory of " + diagnostic.experimentName + " made nothing");
+      return false;
+    }
+    description.experiment = experiment->experimentDescription();
+    return true;
+  });
+  if (description.error != nullptr || diagnostic.experimentOnly) return description;
+  callPlugin("describing " + diagnostic.analysisName, &description.error, [&](DiagnosticErrorPtr* error) {
+    const std::shared_ptr<QZAnalysis> analysis = diagnostic.makeAnalysis();
+    if (analysis == nullptr) {
+      *error = hostError(HostErrorCode::kNothingMade, "the factory of " + diagnostic.analysisName + " made nothing");
+      return false;
+    }
+    description.analysis = analysis->analysisDescription();
+    return true;
+  });
+  return description;
+}
+
+DiagnosticDescription describeIfWanted(const Diagnostic& diagnostic, const std::vector<Diagnostic>& wanted) {
+  if (contains(wanted, diagnostic)) return describeDiagnostic(diagnostic);
+  DiagnosticDescription none;
+  none.isAsked = false;
+  return none;
+}
+
+std::vector<Diagnostic> allOf(const std::vector<Diagnostic>& catalogue, Wanted wanted) {
+  return thoseThat(catalogue, [wanted](const Diagnostic& one) { return isWanted(one, wanted); });
+}
+
+std::vector<Diagnostic> selectDiagnostics(const std::vector<Diagnostic>& catalogue, Wanted wanted,
+                                          const std::vector<std::string>& names) {
+  std::vector<Diagnostic> selected;
+  const std::vector<Diagnostic> all = allOf(catalogue, wanted);
+  const std::vector<Diagnostic> byName = reachable(catalogue, wanted);
+  for (const std::string& name : names) {
+    std::vector<Diagnostic> found = thoseThat(byName, [&name](const Diagnostic& one) { return one.name == name; });
+    const auto matches = [&name](const Diagnostic& one) { return matchesName(name, one.name); };
+    if (found.empty()) found = thoseThat(all, matches);
+    if (found.empty()) found = thoseThat(byName, matches);
+    if (found.empty()) refuseName(catalogue, wanted, name);
+    for (Diagnostic& one : found) {
+      if (!contains(selected, one)) selected.push_back(std::move(one));
+    }
+  }
+  return selected;
+}
+
+bool contains(const std::vector<Diagnostic>& diagnostics, const Diagnostic& wanted) {
+  return std::any_of(diagnostics.begin(), diagnostics.end(), [&wanted](const Diagnostic& one) {
+    return one.name == wanted.name && one.experimentOnly == wanted.experimentOnly;
+  });
+}
+
+bool matchesName(const std::string& pattern, const std::string& name) {
+  return pattern == name || fnmatch(pattern.c_str(), name.c_str(), FNM_NOESCAPE) == 0;
+}
+
+bool isPattern(const std::string& text) { return text.find_first_of("*?[") != std::string::npos; }
+
+std::vector<std::string> namesOf(const std::vector<Diagnostic>& diagnostics) {
+  std::vector<std::string> names;
+  names.reserve(diagnostics.size());
+  for (const Diagnostic& diagnostic : diagnostics) names.push_back(diagnostic.name);
+  return names;
+}
+
+}  // namespace quazor

@@ -1,0 +1,39 @@
+#include "host/record/previous_run.h"
+
+#include <algorithm>
+#include <cstdlib>
+
+namespace quazor {
+
+namespace {
+
+std::filesystem::path directoryIn(const char* variable) {
+  const char* const value = std::getenv(variable);
+  // A relative path is to be ignored, as the rules of base directories have it.
+  return value != nullptr && *value == '/' ? value : "";
+}
+
+}  // namespace
+
+std::filesystem::path previousRunFile() {
+  std::filesystem::path state = directoryIn("XDG_STATE_HOME");
+  if (state.empty()) {
+    state = directoryIn("HOME");
+    if (state.empty()) return {};
+    state /= ".local/state";
+  }
+  return state / "quazor" / "last_run.jsonl";
+}
+
+std::vector<std::string> failedNames(const RecordedRun& run) {
+  std::vector<std::string> names;
+  for (const std::string& name : run.began.names) {
+    const bool passed = std::any_of(run.records.begin(), run.records.end(), [&name](const DiagnosticRecord& one) {
+      return one.name == name && one.verdict == Verdict::kPass;
+    });
+    if (!passed) names.push_back(name);
+  }
+  return names;
+}
+
+}  // namespace quazor

@@ -1,0 +1,94 @@
+#include "host/run/event_pipeline.h"
+
+#include "host/device/phone.h"
+#include "host/error/host_error.h"
+#include "host/record/previous_run.h"
+#include "host/text/timestamp.h"
+
+#include <chrono>
+#include <system_error>
+
+namespace quazor {
+
+namespace {
+
+constexpr std::chrono::seconds kMaxWaitOfInterrupt{1};
+
+// The record of the last run, or null where there is no place for it: it is kept unasked, so nothing depends on it.
+std::unique_ptr<RecordWriter> lastRunRecord() {
+  const std::filesystem::path file = previousRunFile();
+  if (file.empty()) return nullptr;
+  std::error_code ignored;
+  std::filesystem::create_directories(file.parent_path(), ignored);
+  try {
+    return std::make_unique<RecordWriter>(file);
+  } catch (const CommandError&) {
+    return nullptr;
+  }
+}
+
+}  // namespace
+
+EventPipeline::EventPipeline(const EventPipelineOptions& options, Console& console) : report_(options.report, console) {
+  if (!options.record.empty()) records_.push_back(std::make_unique<RecordWriter>(options.record));
+  required_ = records_.size();
+  if (options.keepsLastRun) {
+    if (std::unique_ptr<RecordWriter> last = lastRunRecord()) records_.push_back(std::move(last));
+  }
+  if (options.systemLog) systemLog_ = systemLogOfThisMachine();
+}
+
+void EventPipeline::take(const RunEvent& event) {
+  const std::lock_guard lock(mutex_);
+  pass(event);
+}
+
+void EventPipeline::pass(const RunEvent& event) {
+  if (!records_.empty()) {
+    // A million log lines are made into text once, not once for each record.
+    const std::string line = recordLine(event, recorded_++);
+    for (const std::unique_ptr<RecordWriter>& record : records_) record->take(event, line);
+  }
+  builder_.take(event);
+  if (const auto* const logged = std::get_if<Logged>(&event); logged != nullptr && systemLog_ != nullptr) {
+    systemLog_->write(logged->line.level, sharedLog().subsystem(), sharedLog().category(), logged->line.text);
+  }
+  report_.take(event);
+  if (std::holds_alternative<RunEnded>(event)) ended_ = true;
+}
+
+void EventPipeline::endDiagnostic() {
+  const std::lock_guard lock(mutex_);
+  endOpenDiagnostic();
+}
+
+void EventPipeline::endOpenDiagnostic() {
+  for (std::size_t i = 0; i < required_; ++i) {
+    const RecordWriter& record = *records_[i];
+    if (record.problem().empty()) continue;
+    pass(Failed{std::nullopt, hostError(HostErrorCode::kNotRecorded, "the record '" + record.file().string() +
+                                                                         "' cannot be written: " + record.problem())});
+  }
+  for (const RunEvent& event : builder_.ending(dateNow())) pass(event);
+}
+
+void EventPipeline::interruptRun() {
+  if (ended_) return;
+  std::string running;
+  if (builder_.isOpen()) {
+    running = builder_.record().name;
+    const std::optional<Stage> stage = builder_.stage();
+    pass(
+        Failed{stage ? stage : Stage::kDescribe, hostError(HostErrorCode::kInterrupted, running + " was interrupted")});
+    endOpenDiagnostic();
+  }
+  pass(RunEnded{running, dateNow()});
+}
+
+void EventPipeline::interruptAndLeave(const std::function<void()>& leave) {
+  const std::unique_lock lock(mutex_, kMaxWaitOfInterrupt);
+  if (lock.owns_lock()) interruptRun();
+  leave();
+}
+
+}  // namespace quazor
