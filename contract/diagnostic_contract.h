@@ -20,12 +20,14 @@
 namespace QUAZOR_CONTRACT {
 
 // The host as an experiment or analysis may see it in its setup. It offers nothing yet.
+// Thread: one at a time.
 class QUAZOR_EXPORT QZDiagnosticHost {
  public:
   virtual ~QZDiagnosticHost();
 };
 
 // Drives hardware and collects measurements.
+// Thread: the host's, one call at a time.
 class QUAZOR_EXPORT QZExperiment {
  public:
   QZExperiment() = default;
@@ -42,6 +44,7 @@ class QUAZOR_EXPORT QZExperiment {
 };
 
 // The optional last operation of an experiment; one that has it inherits this too.
+// Thread: the host's, as QZExperiment.
 class QUAZOR_EXPORT QZTeardown {
  public:
   virtual ~QZTeardown();
@@ -50,6 +53,7 @@ class QUAZOR_EXPORT QZTeardown {
 };
 
 // Turns an experiment's result into measured results with limits.
+// Thread: the host's, one call at a time.
 class QUAZOR_EXPORT QZAnalysis {
  public:
   QZAnalysis() = default;
@@ -64,6 +68,7 @@ class QUAZOR_EXPORT QZAnalysis {
 };
 
 // The optional setup of an analysis; one that has it inherits this too.
+// Thread: the host's, as QZAnalysis.
 class QUAZOR_EXPORT QZAnalysisSetup {
  public:
   virtual ~QZAnalysisSetup();

@@ -27,6 +27,7 @@ inline constexpr std::string_view underlyingErrorKey = "underlying-error";      
 //
 // Failure itself is told by an operation's return value, never by its error: an out-argument may hold an error after
 // a success, and may be empty after a failure.
+// Thread: any.
 class QUAZOR_EXPORT DiagnosticError {
  public:
   DiagnosticError(std::string_view domain, std::int64_t code, Dictionary userInfo);

@@ -20,6 +20,7 @@ namespace QUAZOR_CONTRACT {
 enum class LogLevel : int { kError = 1, kDefault = 2, kDebug = 3 };
 
 // Where log lines go: a platform service.
+// Thread: any.
 class QUAZOR_EXPORT LogBackend {
  public:
   LogBackend() = default;
@@ -34,7 +35,8 @@ class QUAZOR_EXPORT LogBackend {
   virtual void write(LogLevel level, std::string_view subsystem, std::string_view category, std::string_view text) = 0;
 };
 
-// There is one in a process: sharedLog(). Any thread.
+// There is one in a process: sharedLog().
+// Thread: any.
 class QUAZOR_EXPORT LogChannel {
  public:
   LogChannel(const LogChannel&) = delete;

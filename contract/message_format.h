@@ -30,6 +30,7 @@
 namespace QUAZOR_CONTRACT {
 
 // One argument of a message: a number, or a pointer to what is to be inserted. Borrows; lives for one call.
+// Thread: one at a time.
 class MessageArgument {
  public:
   enum class Type : std::uint8_t {
@@ -160,6 +161,7 @@ void theFormatHasFewerPlaceholdersThanArguments();
 void anArgumentDoesNotFitItsPlaceholder();
 
 // A format that has been checked against the types of its arguments. Only string literals convert to it.
+// Thread: any.
 template <class... Arguments>
 class CheckedFormat {
  public:

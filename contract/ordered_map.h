@@ -17,8 +17,8 @@ namespace QUAZOR_CONTRACT {
 // A dictionary that iterates in insertion order and finds a key in constant time on average.
 //
 // Setting a key that is already there replaces its value and keeps its place. A looked-up pointer is valid until the
-// next set() or erase(). Looking a key up never inserts it. Copies are independent. Not synchronised: any number of
-// readers, or one writer.
+// next set() or erase(). Looking a key up never inserts it. Copies are independent.
+// Thread: one at a time; any number may read while none writes.
 template <class T>
 class OrderedMap {
  public:

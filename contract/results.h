@@ -16,6 +16,7 @@
 namespace QUAZOR_CONTRACT {
 
 // A parameter that takes a number.
+// Thread: one at a time; any number may read while none writes.
 class QZNumberParameter {
  public:
   QZNumberParameter(std::string_view summary, bool required) : summary_(summary), required_(required) {}
@@ -29,6 +30,7 @@ class QZNumberParameter {
 };
 
 // What an experiment or an analysis says of itself: a summary and named parameters, in the order of their adding.
+// Thread: one at a time; any number may read while none writes.
 class QZDescription {
  public:
   explicit QZDescription(std::string_view summary) : summary_(summary) {}
@@ -45,6 +47,7 @@ class QZDescription {
 };
 
 // What an experiment measured. Made empty; the experiment fills it, the host owns it from then on.
+// Thread: one at a time; any number may read while none writes.
 class QZExperimentResult {
  public:
   OrderedMap<Measurement>& measurements() { return measurements_; }
@@ -58,6 +61,7 @@ class QZExperimentResult {
 };
 
 // One end of a limit. An open bound leaves its own value out of the accepted range.
+// Thread: any; it is immutable.
 class QZBound {
  public:
   QZBound(const Measurement& value, bool open) : value_(value), open_(open) {}
@@ -71,6 +75,7 @@ class QZBound {
 };
 
 // The accepted range of a measured result; a bound that is not set does not limit. Both bounds may be one object.
+// Thread: one at a time; any number may read while none writes.
 class QZLimit {
  public:
   explicit QZLimit(std::string_view name) : name_(name) {}
@@ -90,6 +95,7 @@ class QZLimit {
 };
 
 // A named measurement that the host judges against its limit; one without a limit is for information.
+// Thread: one at a time; any number may read while none writes.
 class QZMeasuredResult {
  public:
   QZMeasuredResult(std::string_view name, const Measurement& measurement) : name_(name), measurement_(measurement) {}
@@ -107,6 +113,7 @@ class QZMeasuredResult {
 };
 
 // What an analysis found, in the order in which it looked. Made empty.
+// Thread: one at a time; any number may read while none writes.
 class QZAnalysisResult {
  public:
   std::vector<QZMeasuredResult>& measuredResults() { return measuredResults_; }

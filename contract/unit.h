@@ -10,6 +10,7 @@ namespace QUAZOR_CONTRACT {
 
 // A unit, known by its symbol. There is one object per symbol in a process, so units compare by address; none is ever
 // released.
+// Thread: any.
 class QUAZOR_EXPORT QZUnit {
  public:
   QZUnit(const QZUnit&) = delete;
@@ -26,7 +27,8 @@ class QUAZOR_EXPORT QZUnit {
   std::string symbol_;
 };
 
-// The shared units of counts. Any thread.
+// The shared units of counts.
+// Thread: any.
 class QUAZOR_EXPORT QZDimensionlessUnit {
  public:
   static const QZUnit& frames();
@@ -35,6 +37,7 @@ class QUAZOR_EXPORT QZDimensionlessUnit {
 };
 
 // A value in a unit.
+// Thread: one at a time; any number may read while none writes.
 class Measurement {
  public:
   Measurement(double value, const QZUnit& unit) : value_(value), unit_(&unit) {}

@@ -30,6 +30,7 @@ using Bytes = std::vector<std::uint8_t>;
 using Date = std::chrono::sys_time<std::chrono::nanoseconds>;
 
 // What a Value can refer to without copying it: a platform object (a stream, a group) or a handler.
+// Thread: as the derived class says.
 class QUAZOR_EXPORT Object {
  public:
   Object() = default;
@@ -53,7 +54,7 @@ concept ValueInteger =
 // Copied deeply in meaning: what a Value holds never changes, so copies share it and cost a reference count. A number
 // keeps the kind it was made of. There is no null Value; "no value" is an empty std::optional or a null pointer.
 // A Value that was moved from may only be assigned to or destroyed; one of a null object or error prints (null).
-// Any thread may read a Value that no thread assigns to.
+// Thread: one at a time; any number may read while none assigns.
 class QUAZOR_EXPORT Value {
  public:
   // In the order of the alternatives that hold them.

@@ -25,6 +25,7 @@
 namespace QUAZOR_CONTRACT {
 
 // What has properties (platform/capture_keys.h): a device, a group, a stream.
+// Thread: one at a time for a device and what belongs to it; a frame handler may read properties meanwhile.
 class QUAZOR_EXPORT CaptureObject : public Object {
  public:
   ~CaptureObject() override;
@@ -36,6 +37,7 @@ class QUAZOR_EXPORT CaptureObject : public Object {
   virtual bool setValue(const Value& value, std::string_view key, DiagnosticErrorPtr* error) = 0;
 };
 
+// Thread: one at a time for a device's streams; a frame handler may read properties and call stop() meanwhile.
 class QUAZOR_EXPORT CaptureStream : public CaptureObject {
  public:
   ~CaptureStream() override;
@@ -48,6 +50,7 @@ class QUAZOR_EXPORT CaptureStream : public CaptureObject {
 using CaptureStreams = std::vector<std::shared_ptr<CaptureStream>>;
 
 // Streams that can run in lockstep, one of them as the master.
+// Thread: one at a time for a device and its groups.
 class QUAZOR_EXPORT SynchronizedStreamsGroup : public CaptureObject {
  public:
   ~SynchronizedStreamsGroup() override;
@@ -57,6 +60,7 @@ class QUAZOR_EXPORT SynchronizedStreamsGroup : public CaptureObject {
 };
 using SynchronizedStreamsGroups = std::vector<std::shared_ptr<SynchronizedStreamsGroup>>;
 
+// Thread: one at a time; different devices are independent.
 class QUAZOR_EXPORT CaptureDevice : public CaptureObject {
  public:
   ~CaptureDevice() override;
@@ -73,6 +77,7 @@ class QUAZOR_EXPORT CaptureDevice : public CaptureObject {
   virtual bool invalidate(DiagnosticErrorPtr* error) = 0;
 };
 
+// Thread: any.
 class QUAZOR_EXPORT CapturePlugIn : public Object {
  public:
   ~CapturePlugIn() override;
@@ -81,7 +86,8 @@ class QUAZOR_EXPORT CapturePlugIn : public Object {
   virtual std::shared_ptr<CaptureDevice> device(DiagnosticErrorPtr* error) = 0;
 };
 
-// Where a capture plug-in comes from. Any thread.
+// Where a capture plug-in comes from.
+// Thread: any.
 class QUAZOR_EXPORT CaptureService {
  public:
   CaptureService() = default;

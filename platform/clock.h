@@ -11,7 +11,7 @@ namespace QUAZOR_CONTRACT {
 // Seconds as nanoseconds: truncated toward zero, saturating; not-a-number is 0.
 QUAZOR_EXPORT std::chrono::nanoseconds nanosecondsFromSeconds(double seconds);
 
-// Any thread.
+// Thread: any.
 class QUAZOR_EXPORT Clock {
  public:
   Clock() = default;

@@ -17,6 +17,7 @@ namespace QUAZOR_CONTRACT {
 //
 // Destroying a queue never blocks, and may happen in one of its own tasks: tasks that were due still run, those whose
 // delay had not yet passed are destroyed without running.
+// Thread: any.
 class QUAZOR_EXPORT SerialQueue {
  public:
   SerialQueue() = default;
@@ -31,7 +32,8 @@ class QUAZOR_EXPORT SerialQueue {
   virtual void asyncAfter(std::chrono::nanoseconds delay, Task task) = 0;
 };
 
-// A counting semaphore. Any thread.
+// A counting semaphore.
+// Thread: any.
 class QUAZOR_EXPORT Semaphore {
  public:
   Semaphore() = default;
@@ -48,7 +50,8 @@ class QUAZOR_EXPORT Semaphore {
 // How soon a queue's tasks should run when the machine is busy.
 enum class QualityOfService { kUserInteractive, kDefault, kBackground };
 
-// Makes queues and semaphores. Any thread. What it made may outlive it.
+// Makes queues and semaphores. What it made may outlive it.
+// Thread: any.
 class QUAZOR_EXPORT Concurrency {
  public:
   Concurrency() = default;

@@ -15,6 +15,7 @@
 namespace QUAZOR_CONTRACT {
 
 // A driver's entry in the system's registry of devices.
+// Thread: one at a time.
 class QUAZOR_EXPORT RegistryService : public Object {
  public:
   ~RegistryService() override;
@@ -23,6 +24,7 @@ class QUAZOR_EXPORT RegistryService : public Object {
   virtual std::optional<Value> registryProperty(std::string_view name) = 0;
 };
 
+// Thread: one at a time.
 class QUAZOR_EXPORT Display : public Object {
  public:
   ~Display() override;
@@ -31,6 +33,7 @@ class QUAZOR_EXPORT Display : public Object {
   virtual std::shared_ptr<RegistryService> registryService() = 0;
 };
 
+// Thread: any.
 class QUAZOR_EXPORT FramebufferService {
  public:
   FramebufferService() = default;

@@ -27,6 +27,7 @@ namespace QUAZOR_CONTRACT {
 inline constexpr std::string_view kHidPrimaryUsagePage = "PrimaryUsagePage";
 inline constexpr std::string_view kHidPrimaryUsage = "PrimaryUsage";
 
+// Thread: one at a time; input reports come on the thread of the run loop that the device is scheduled on.
 class QUAZOR_EXPORT HidDevice : public Object {
  public:
   // A report that came in: its ID and all its bytes, the ID first. With an error there is no report, the ID is 0 and
@@ -54,6 +55,7 @@ class QUAZOR_EXPORT HidDevice : public Object {
 };
 
 // One user's view of the devices of the system.
+// Thread: one at a time.
 class QUAZOR_EXPORT HidManager : public Object {
  public:
   ~HidManager() override;
@@ -64,6 +66,7 @@ class QUAZOR_EXPORT HidManager : public Object {
   virtual std::vector<std::shared_ptr<HidDevice>> devices() = 0;
 };
 
+// Thread: any.
 class QUAZOR_EXPORT HidService {
  public:
   HidService() = default;

@@ -15,7 +15,8 @@
 namespace QUAZOR_CONTRACT {
 
 // References are counted by hand, as the hardware's buffer pool does it: whoever wants the buffer beyond the call that
-// handed it over takes a reference, and the buffer goes back to its pool with the last one. Any thread.
+// handed it over takes a reference, and the buffer goes back to its pool with the last one.
+// Thread: any.
 class QUAZOR_EXPORT PixelBuffer {
  public:
   PixelBuffer() = default;
@@ -34,6 +35,7 @@ class QUAZOR_EXPORT PixelBuffer {
 
 // Called with every frame of an output, on any thread of the capture service, perhaps several at once. The buffer is
 // borrowed for the call. Must return soon: frames wait behind it. May let go of the last reference to its own stream.
+// Thread: any of the capture service, perhaps several at once.
 class QUAZOR_EXPORT PixelBufferHandler final : public Object {
  public:
   using Function = std::function<void(PixelBuffer& buffer, MediaTime presentationTime)>;
@@ -49,6 +51,7 @@ class QUAZOR_EXPORT PixelBufferHandler final : public Object {
 };
 
 // Called with every event of an output; as PixelBufferHandler. `info` may be null.
+// Thread: any, as PixelBufferHandler.
 class QUAZOR_EXPORT EventHandler final : public Object {
  public:
   using Function = std::function<void(std::int32_t event, MediaTime time, const Value* info)>;

@@ -29,6 +29,7 @@ struct ReportChannelDescription {
 };
 
 // One channel of a set, with its value as a simple counter at the moment of a snapshot.
+// Thread: one at a time; any number may read while none writes.
 class ReportChannel {
  public:
   ReportChannel(std::shared_ptr<const ReportChannelDescription> description, std::optional<Value> count)
@@ -44,6 +45,7 @@ class ReportChannel {
 };
 
 // One entry of a snapshot.
+// Thread: one at a time; any number may read while none writes.
 class ReportSample {
  public:
   explicit ReportSample(ReportChannel channel) : channel_(std::move(channel)) {}
@@ -55,6 +57,7 @@ class ReportSample {
 };
 
 // The values of every channel of a set at one moment, or their differences between two.
+// Thread: any; it is immutable.
 class QUAZOR_EXPORT ReportSnapshot {
  public:
   ReportSnapshot() = default;
@@ -70,6 +73,7 @@ class QUAZOR_EXPORT ReportSnapshot {
 };
 
 // A subscription to a set of channels.
+// Thread: any; it is immutable.
 class QUAZOR_EXPORT ReportChannelSet {
  public:
   using Predicate = std::function<bool(const ReportChannelDescription&)>;
@@ -85,6 +89,7 @@ class QUAZOR_EXPORT ReportChannelSet {
   virtual std::shared_ptr<const ReportSnapshot> snapshot(DiagnosticErrorPtr* error) const = 0;
 };
 
+// Thread: any.
 class QUAZOR_EXPORT ReportFacility {
  public:
   ReportFacility() = default;

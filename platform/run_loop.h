@@ -37,6 +37,7 @@ enum class RunLoopResult {
 };
 
 // Something that can happen. Made by a loop, which holds it while it is added.
+// Thread: any for signal(); the rest is its loop's.
 class QUAZOR_EXPORT RunLoopSource {
  public:
   RunLoopSource() = default;
@@ -50,6 +51,7 @@ class QUAZOR_EXPORT RunLoopSource {
 };
 
 // Is told of a loop's activities. Made by a loop, which holds it while it is added.
+// Thread: its loop's.
 class QUAZOR_EXPORT RunLoopObserver {
  public:
   RunLoopObserver() = default;
@@ -100,6 +102,7 @@ class QUAZOR_EXPORT RunLoop {
 };
 
 // Gives threads their loops.
+// Thread: any.
 class QUAZOR_EXPORT RunLoops {
  public:
   RunLoops() = default;

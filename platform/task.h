@@ -15,7 +15,8 @@ namespace QUAZOR_CONTRACT {
 // need no stricter alignment than a pointer are held in place, so that posting them allocates nothing; others are held
 // on the heap.
 //
-// Not synchronised. The callable is destroyed with the Task that holds it.
+// The callable is destroyed with the Task that holds it.
+// Thread: one at a time.
 class Task {
  public:
   static constexpr std::size_t kInlineSize = 48;
