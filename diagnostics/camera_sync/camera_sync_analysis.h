@@ -10,6 +10,7 @@
 namespace quazor {
 
 // Per camera it gives the frame offset, the frame count and their sum, in this order.
+// Thread: the host's, as QZAnalysis.
 class QZCameraSyncAnalysis final : public QZAnalysis {
  public:
   // `ports` are port types; one without a camera name is left out.

@@ -14,6 +14,7 @@ class CameraSession;
 
 // The result holds, per port that has a camera name (diagnostics/camera_sync/camera_names.h), the measurements
 // CAMERA.FrameOffset and CAMERA.Frames, and under the auxiliary data's ErrorCounters what the stream counted.
+// Thread: the host's, as QZExperiment.
 class QZCameraSyncExperiment final : public QZExperiment {
  public:
   // `ports` are port types; the first one must be the group's synchronisation master. formatIndexes[i] is the format

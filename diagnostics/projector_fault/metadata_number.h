@@ -11,6 +11,7 @@ namespace quazor {
 
 // Holds a number of any kind that a Value can be, and gives it back as that kind. A Value that is no number counts as
 // none. Copies and goes like a plain integer, which a Value does not.
+// Thread: one at a time; any number may read while none writes.
 class MetadataNumber {
  public:
   // Nothing is copied but the number itself: a frame has many, and a million frames a second may come.

@@ -13,6 +13,7 @@ namespace quazor {
 // own is empty.
 //
 // Blocks are kept until the pool is destroyed: as many as were in use at one time.
+// Thread: one at a time for take(); any for give().
 class RecordPool {
  public:
   RecordPool() = default;
@@ -39,6 +40,7 @@ class RecordPool {
 };
 
 // For std::allocate_shared; the pool, which serves one type, must outlive every object in it.
+// Thread: as RecordPool.
 template <class T>
 class PoolAllocator {
  public:

@@ -15,6 +15,7 @@ inline constexpr std::string_view kFrameCountParameter = "frameCount";
 
 // Gives a result per expected report channel, limited to 0, the frame count with its minimum, and the I2C, MIPI and
 // SIF errors, limited to 0. The LPDP, UART and projector errors are for the record and not judged.
+// Thread: the host's, as QZAnalysis.
 class QZTesselFaultAnalysis final : public QZAnalysis, public QZAnalysisSetup {
  public:
   // The number of frames that the run must have delivered at least; absent, it counts as 0.

@@ -22,7 +22,7 @@ namespace quazor {
 // Must be owned by a std::shared_ptr: its stream's handlers hold it weakly, its tasks in part strongly. The last
 // reference may go on any thread, one of its own queues' included.
 //
-// Threads: the host's calls come on the host's thread. Frames and events come on the capture service's threads and are
+// Thread: the host's calls come on the host's thread. Frames and events come on the capture service's threads and are
 // taken in on the receiving queue, where they are counted; lit or not is found out on the processing queue, where
 // the timeout runs too. Whichever ends the stream does so under the experiment's lock, once.
 class QZTesselFaultExperiment final : public QZExperiment,

@@ -20,7 +20,7 @@ namespace quazor {
 // Holds the frame's running number, its presentation time, the moment the record was made, and the projector and
 // illuminator metadata that the capture service attached to the frame, as the service delivered it.
 //
-// Not synchronised: made on one thread, then read by others, changed by none.
+// Thread: one while it is being filled; any may read it afterwards.
 class QZTesselFrameDescription final : public Object {
  public:
   // A number of the metadata; absent where it was set to nothing or to what is no number, floodActiveTemperature also

@@ -9,6 +9,7 @@ namespace quazor {
 
 // Gives one result per expected name, in the order of expectedTelemonNames(), limited to 0; other measurements are
 // left alone.
+// Thread: the host's, as QZAnalysis.
 class QZTesselTelemonAnalysis final : public QZAnalysis {
  public:
   QZDescription analysisDescription() const override;

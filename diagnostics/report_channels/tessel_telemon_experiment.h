@@ -10,6 +10,7 @@ namespace quazor {
 
 // The result holds one measurement per channel, its count in events under the channel's name; of two channels with one
 // name the later one stands. No channels give an empty result.
+// Thread: the host's, as QZExperiment.
 class QZTesselTelemonExperiment final : public QZExperiment {
  public:
   explicit QZTesselTelemonExperiment(Platform platform = installedPlatform());

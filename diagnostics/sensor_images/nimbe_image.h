@@ -33,6 +33,7 @@ inline constexpr std::size_t kNimbeScanSize = 48;
 using NimbeImageRecord = std::array<std::uint8_t, kNimbeImageRecordSize>;
 
 // The values of one record. The samples are kept as plain numbers; they become Values when they are asked for.
+// Thread: one at a time; any number may read while none writes.
 class QZNimbeCorvaneImage {
  public:
   // Of a record whose bytes after the report ID are all zero.

@@ -14,6 +14,7 @@
 namespace quazor {
 
 // Receives what a stream has to tell, on the thread that runs the stream's loop.
+// Thread: that of the stream's run loop.
 class QZNimbeImageStreamDelegate {
  public:
   QZNimbeImageStreamDelegate() = default;
