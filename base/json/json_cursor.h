@@ -19,7 +19,8 @@ namespace quazor {
 // Reads with checks: every wrong type, unknown key and number out of range throws JsonProblem with "PATH: " and one
 // sentence that says what is wrong and what would be right.
 //
-// Borrows the document. Not synchronised.
+// Borrows the document.
+// Thread: one at a time.
 class JsonCursor {
  public:
   explicit JsonCursor(const nlohmann::ordered_json& document) : JsonCursor(document, "") {}
