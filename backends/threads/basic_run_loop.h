@@ -17,6 +17,7 @@
 namespace quazor {
 
 // How the thread of a loop waits, and how it is woken.
+// Thread: the loop's, unless a function says otherwise.
 class RunLoopWaiter {
  public:
   // A moment that never comes.

@@ -11,7 +11,8 @@
 
 namespace quazor {
 
-// Times are readings of the steady clock. Any thread.
+// Times are readings of the steady clock.
+// Thread: any.
 class DelayedTasks {
  public:
   // A due time that never comes.

@@ -9,6 +9,7 @@ namespace quazor {
 
 // One thread sleeps here; any thread wakes it. The sleeper prepares, then makes known that it will sleep, then parks:
 // a wake-up that falls between is not lost.
+// Thread: the sleeper's, but for unpark(): any.
 class Parker {
  public:
   // Forgets the wake-ups so far.

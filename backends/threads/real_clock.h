@@ -7,7 +7,8 @@
 
 namespace quazor {
 
-// Stateless. Any thread.
+// Stateless.
+// Thread: any.
 class RealClock final : public Clock {
  public:
   // The steady clock.

@@ -24,7 +24,8 @@ struct LogRecord {
 // For tests that compare records: on failure they are printed as level/subsystem/category/text.
 std::ostream& operator<<(std::ostream& out, const LogRecord& record);
 
-// Keeps every line, in the order in which they came, until it is taken. Any thread.
+// Keeps every line, in the order in which they came, until it is taken.
+// Thread: any.
 class RecordingLog final : public LogBackend {
  public:
   void write(LogLevel level, std::string_view subsystem, std::string_view category, std::string_view text) override;

@@ -20,6 +20,7 @@ namespace quazor {
 std::string readableLogLine(Date date, LogLevel level, std::string_view category, std::string_view text);
 
 // Hands each line to the stream with one call, so that lines of several threads never mix.
+// Thread: any.
 class StandardErrorLog final : public LogBackend {
  public:
   // `clock` dates the lines. `descriptor` is borrowed and stays open: a test gives its own.

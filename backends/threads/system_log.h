@@ -11,6 +11,7 @@
 namespace quazor {
 
 // Gives each line to syslog(3), as "category: text", under the name kIdentifier.
+// Thread: any.
 class SystemLog final : public LogBackend {
  public:
   static constexpr char kIdentifier[] = "quazor";

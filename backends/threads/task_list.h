@@ -44,6 +44,7 @@ inline void cpuRelax() {
 
 // Waits for another thread that is between two instructions, most likely on another processor: polls at first, and
 // gives the processor away when the other thread has evidently lost its own.
+// Thread: one at a time.
 class Backoff {
  public:
   void pause();
@@ -53,6 +54,7 @@ class Backoff {
 };
 
 // Any number of producers, one consumer.
+// Thread: any for push(); all else the one consumer's.
 class TaskList {
  public:
   TaskList();

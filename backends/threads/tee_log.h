@@ -10,6 +10,7 @@
 namespace quazor {
 
 // Hands every line to each of its back-ends, in their order. Any thread, as far as they allow it.
+// Thread: any.
 class TeeLog final : public LogBackend {
  public:
   // None of them may be null.

@@ -8,7 +8,8 @@
 
 namespace quazor {
 
-// Stateless. Any thread.
+// Stateless.
+// Thread: any.
 class ThreadConcurrency final : public Concurrency {
  public:
   // A ThreadSerialQueue. A process that can have no more threads is ended, as one without memory is.

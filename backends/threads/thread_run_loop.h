@@ -10,6 +10,7 @@ namespace quazor {
 //
 // A signal and a stop take no lock, and make a system call only when the loop's thread sleeps. A thread with nothing to
 // do sleeps until it is woken or its time limit comes; one that is woken often looks out for a moment before it sleeps.
+// Thread: any.
 class ThreadRunLoops final : public RunLoops {
  public:
   // Never null.

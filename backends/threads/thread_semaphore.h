@@ -9,6 +9,7 @@
 namespace quazor {
 
 // With a count below zero, as many signals more are needed before a wait returns.
+// Thread: any.
 class ThreadSemaphore final : public Semaphore {
  public:
   explicit ThreadSemaphore(long count) : count_(count) {}

@@ -20,6 +20,7 @@ namespace quazor {
 //
 // A delayed task is posted, as if by async, at the moment it becomes due: a task that is posted later runs later, even
 // when the thread was busy at that moment.
+// Thread: any.
 class ThreadSerialQueue final : public SerialQueue {
  public:
   // The thread is named with the last 15 characters of `label`, as many as the system keeps: labels of one subject
