@@ -8,6 +8,7 @@
 namespace quazor {
 
 // An installation, found from the program's own place: PREFIX/bin/quazor. A build tree has the same layout.
+// Thread: one at a time; any number may read while none writes.
 class Installation {
  public:
   explicit Installation(const std::filesystem::path& program);

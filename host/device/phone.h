@@ -25,6 +25,7 @@ struct DeclaredFault {
 };
 
 // One phone, for one run. Its platform's services may outlive it.
+// Thread: one at a time, but for framesDelivered(): any.
 class Phone {
  public:
   Phone() = default;

@@ -10,6 +10,7 @@ namespace quazor {
 
 // Folds the events of one diagnostic after the other. Events that belong to no diagnostic, and those of a diagnostic
 // before its DiagnosticStarted, change nothing.
+// Thread: one at a time.
 class RecordBuilder final : public RunEventSink {
  public:
   void take(const RunEvent& event) override;

@@ -96,6 +96,7 @@ using RunEvent =
                  ResultsReported, Failed, FaultsCounted, DiagnosticCompleted, DiagnosticEnded, RunEnded>;
 
 // Takes a run's events, in their order.
+// Thread: one at a time.
 class RunEventSink {
  public:
   RunEventSink() = default;

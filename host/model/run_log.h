@@ -24,7 +24,8 @@ struct LogLine {
   Date date{};  // by the wall clock
 };
 
-// Tells every line as an event, until it is closed. Any thread.
+// Tells every line as an event, until it is closed.
+// Thread: any.
 class RunLog final : public LogBackend {
  public:
   // The run begins now. `events` is borrowed until close(), and gets one line at a time.

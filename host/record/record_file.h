@@ -19,6 +19,7 @@ std::string recordLine(const RunEvent& event, std::uint64_t sequence);
 // Writes a record while the run goes on. A line is handed to the system as a whole before take() returns, so that
 // what has been taken is in the file whatever happens to this process, and a file that was cut off ends in a line
 // without an end.
+// Thread: one at a time.
 class RecordWriter final : public RunEventSink {
  public:
   // A new file takes the place of one of that name at once. Throws a CommandError (kCannotWrite) when it cannot be

@@ -13,6 +13,7 @@
 namespace quazor {
 
 // Names and values, in the order of their adding.
+// Thread: one at a time.
 class JUnitProperties {
  public:
   void add(const std::string& name, const std::string& value);
@@ -24,6 +25,7 @@ class JUnitProperties {
   std::string elements_;
 };
 
+// Thread: one at a time.
 struct JUnitCounts {
   std::size_t tests = 0;
   std::size_t failures = 0;
@@ -37,6 +39,7 @@ struct JUnitCounts {
 // `<ELEMENT name="..." tests="..." ...>`: a suite's tag, or that of all suites.
 std::string junitTag(const std::string& element, const std::string& name, const JUnitCounts& counts, Date begin);
 
+// Thread: one at a time.
 class JUnitSuite {
  public:
   JUnitSuite(std::string name, Date begin, Date end);

@@ -13,6 +13,7 @@
 namespace quazor {
 
 // Numbers the lines and dates them: each is as late as it says, and never earlier than the line before it.
+// Thread: one at a time.
 class OcpStream {
  public:
   // Begins with the format's version. `out` and `log` are borrowed; lines are appended to `out`. The log's lines go out

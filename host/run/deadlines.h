@@ -20,6 +20,7 @@ struct DeadlineSetting {
 // Throws a CommandError (kUsage) for a text that is not of that form, or whose time is not above zero.
 DeadlineSetting parseDeadline(const std::string& text);
 
+// Thread: any; it is immutable.
 class Deadlines {
  public:
   // Those of a diagnostic with these parameters: where nothing is set, a run may take a minute more than twice the

@@ -26,7 +26,7 @@ struct EventPipelineOptions {
 
 // What the user is told has been recorded before.
 //
-// Any thread; one event goes its way at a time.
+// Thread: any; it handles one event at a time.
 class EventPipeline final : public RunEventSink {
  public:
   // Begins the records that were asked for. Throws a CommandError (kCannotWrite) for a record that cannot be begun.

@@ -11,6 +11,7 @@ namespace quazor {
 // While it lives, an interrupt from the keyboard (SIGINT) no longer ends the process but calls `interrupted`, once, on
 // a thread of its own. Threads that start meanwhile inherit that. Where the process was started with interrupts
 // ignored, they stay ignored.
+// Thread: one at a time; `interrupted` is called on the watcher's own thread.
 class InterruptWatcher {
  public:
   // Throws std::system_error when the system refuses what it needs.

@@ -6,7 +6,7 @@
 
 namespace quazor {
 
-// Any thread of any of the processes.
+// Thread: any, of any of the processes.
 class SharedCounter {
  public:
   // Throws std::system_error when the system refuses the memory.

@@ -28,6 +28,7 @@ std::string countText(std::size_t number, std::string_view what);
 std::string wrapped(std::string_view text, std::string_view first, std::string_view rest);
 
 // Cells in aligned columns. Widths count code points.
+// Thread: one at a time.
 class Table {
  public:
   enum class Align { kLeft, kRight };
