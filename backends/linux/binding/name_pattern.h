@@ -19,7 +19,7 @@ struct ChannelNames {
 // * stands for any text; the placeholders {group}, {subgroup} and {name} for any text that is not empty. Each stands
 // for as little as lets the whole name match. Case counts, and there is no way to write a * or a brace itself.
 //
-// Immutable.
+// Thread: any; it is immutable.
 class NamePattern {
  public:
   // Nothing when the text is no pattern; then `problem`, where given, is what is wrong with it, as the end of a

@@ -7,6 +7,7 @@
 
 namespace quazor {
 
+// Thread: one at a time.
 class FileDescriptor {
  public:
   FileDescriptor() = default;

@@ -21,6 +21,7 @@ namespace quazor {
 // Each line is tried anew, so a journal that is restarted is found again. A journal that has stopped reading costs one
 // line a tenth of a second; from then on lines that it does not take at once are dropped, and their number is told
 // when it takes lines again.
+// Thread: any.
 class JournalLog final : public LogBackend {
  public:
   static constexpr std::string_view kSocket = "/run/systemd/journal/socket";

@@ -22,6 +22,7 @@ struct ControlValue {
 };
 
 // Sets controls of a video node when it is destroyed, and also when its process ends in any other way.
+// Thread: one at a time.
 class ControlGuard {
  public:
   ControlGuard() = default;

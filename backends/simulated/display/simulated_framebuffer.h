@@ -9,7 +9,8 @@
 
 namespace quazor {
 
-// The scenario's main display, which never changes. Thread: any.
+// The scenario's main display, which never changes.
+// Thread: any.
 class SimulatedFramebufferService final : public FramebufferService {
  public:
   SimulatedFramebufferService(const DisplayConfig& display, std::shared_ptr<CallInterceptor> calls);

@@ -9,7 +9,7 @@ namespace quazor {
 // One chooser and one program give one order of events: what it answers is all that is left open in a simulated run.
 // A test hands in its own, say one that replays a list of choices, to steer a run into every order there is.
 //
-// Used by one thread at a time.
+// Thread: one at a time.
 class ScheduleStrategy {
  public:
   ScheduleStrategy() = default;
@@ -23,6 +23,7 @@ class ScheduleStrategy {
 
 // Chooses by a seeded generator (SplitMix64, Steele, Lea and Flood 2014), written out here so that a seed means the
 // same order with every standard library.
+// Thread: one at a time.
 class RandomStrategy final : public ScheduleStrategy {
  public:
   explicit RandomStrategy(std::uint64_t seed) : state_(seed) {}
