@@ -29,6 +29,7 @@ inline constexpr std::string_view kMissingMetadata = "MetadataErrorCount";
 }  // namespace kernel_counter
 
 // What has come of a stream since it began.
+// Thread: one at a time; any number may read while none writes.
 struct FrameCounts {
   std::uint64_t frames = 0;
   std::optional<std::chrono::nanoseconds> first;  // the first frame's time stamp
@@ -49,6 +50,7 @@ struct FrameCounts {
 std::int64_t frameOffset(const FrameCounts& camera, const FrameCounts& master, FrameInterval interval);
 
 // The counters that a binding names: files and controls, whose numbers count from an unknown moment.
+// Thread: one at a time.
 class BoundCounters final {
  public:
   // What they are at the start of a stream; from there on they count. Nothing, and an error, when one cannot be read.

@@ -22,7 +22,7 @@ struct CapturedFrame {
 // numbers do not tell which belong together: each node counts for itself, and one may start where an earlier stream
 // ended. Time stamps do, as drivers stamp both from one reading of the clock.
 //
-// Not thread-safe.
+// Thread: one at a time.
 class FramePairing final {
  public:
   // Stamps that differ by at most this are the same moment: V4L2 gives them in microseconds.

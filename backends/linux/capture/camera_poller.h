@@ -14,6 +14,7 @@
 namespace quazor {
 
 // What is served by the thread. Its calls come one at a time, and only while it is added.
+// Thread: the poller's.
 class PolledStream {
  public:
   PolledStream() = default;
@@ -30,7 +31,8 @@ class PolledStream {
   virtual bool serve(std::span<const pollfd> polled) = 0;
 };
 
-// The thread begins with the first stream and ends with the poller. Thread: any.
+// The thread begins with the first stream and ends with the poller.
+// Thread: any.
 class CameraPoller final {
  public:
   explicit CameraPoller(std::shared_ptr<V4l2Api> kernel);

@@ -15,6 +15,7 @@ namespace quazor {
 //
 // A camera's node is looked for and opened when control of its stream is taken, and closed when that is given back, so
 // a camera that was removed and came back is found again.
+// Thread: any.
 class LinuxCapture : public CaptureService {
  public:
   // How many frames the cameras have handed to handlers. Any thread.

@@ -20,7 +20,8 @@ struct LinuxGroupState {
   Value masterConfiguration{Dictionary{}};
 };
 
-// All users of the service share it. Thread: any, holding `mutex`; what is const needs no lock.
+// All users of the service share it.
+// Thread: any, holding `mutex`; what is const needs no lock.
 struct LinuxCameras {
   // A group that names no camera of the binding is left out; the reader of bindings refuses those.
   LinuxCameras(const Binding& binding, std::shared_ptr<V4l2Api> kernel, DeviceRoots roots);
@@ -47,6 +48,7 @@ struct LinuxCameras {
 };
 
 // Holds the mutex while it lives.
+// Thread: one at a time.
 class HeldCameras final {
  public:
   explicit HeldCameras(LinuxCameras& cameras) : cameras_(cameras), lock_(cameras.mutex) {}
@@ -60,7 +62,8 @@ class HeldCameras final {
 };
 
 // One user of the cameras. A device, its groups and its streams share it; when the last of them is gone, the user's
-// streams stop and others may have them. Thread: any.
+// streams stop and others may have them.
+// Thread: any.
 class LinuxCaptureClient final {
  public:
   explicit LinuxCaptureClient(std::shared_ptr<LinuxCameras> cameras);

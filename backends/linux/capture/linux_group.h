@@ -12,6 +12,7 @@ namespace quazor {
 
 // V4L2 itself starts each camera when it is told to; whether they then run in step is the hardware's, and what
 // MulticamSessionStatus shows. Configurations are checked and kept.
+// Thread: any.
 class LinuxGroup final : public SynchronizedStreamsGroup {
  public:
   // The group at `index`; `streams` are its user's streams of all cameras, by the camera's index.

@@ -12,6 +12,7 @@ namespace quazor {
 
 // Properties are those of platform/capture_keys.h. Setting one needs control of the stream and is refused while it
 // runs.
+// Thread: any.
 class LinuxStream final : public CaptureStream {
  public:
   // The stream of the camera at `index`.

@@ -24,7 +24,8 @@ struct DirectoryEntry {
   EntryKind kind = EntryKind::kOther;
 };
 
-// Every call gives 0 or the error number. Thread: any.
+// Every call gives 0 or the error number.
+// Thread: any.
 class CounterSystem {
  public:
   CounterSystem() = default;

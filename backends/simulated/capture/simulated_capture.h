@@ -12,6 +12,7 @@ namespace quazor {
 
 // One user's device. Its streams and groups are made with it and are the same objects on every path that leads to
 // them. What the user controls is free again when the device, its groups and its streams are gone.
+// Thread: any.
 class SimulatedDevice final : public CaptureDevice {
  public:
   explicit SimulatedDevice(std::shared_ptr<SimulatedCaptureClient> user);
@@ -39,6 +40,7 @@ class SimulatedDevice final : public CaptureDevice {
 };
 
 // Each call of device() makes a device of its own: another user of the same cameras.
+// Thread: any.
 class SimulatedPlugIn final : public CapturePlugIn {
  public:
   SimulatedPlugIn(std::shared_ptr<CaptureHardware> hardware, std::shared_ptr<CallInterceptor> calls);
@@ -51,6 +53,7 @@ class SimulatedPlugIn final : public CapturePlugIn {
   const std::shared_ptr<CallInterceptor> calls_;
 };
 
+// Thread: any.
 class SimulatedCaptureService final : public CaptureService {
  public:
   SimulatedCaptureService(std::shared_ptr<CaptureHardware> hardware, std::shared_ptr<CallInterceptor> calls);

@@ -12,6 +12,7 @@ namespace quazor {
 
 // Properties and their types are those of platform/capture_keys.h. Settings need control of the active streams and are
 // refused while a stream of the group runs.
+// Thread: any.
 class SimulatedGroup final : public SynchronizedStreamsGroup {
  public:
   // The group at `index`; `streams` are its user's streams of all cameras, by the camera's index.

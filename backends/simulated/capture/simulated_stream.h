@@ -12,6 +12,7 @@ namespace quazor {
 
 // Properties and their types are those of platform/capture_keys.h. Settings need control of the stream and are refused
 // while it runs; so is a start with rates that contradict each other or the format, since rates are set one by one.
+// Thread: any.
 class SimulatedStream final : public CaptureStream {
  public:
   // The stream of the camera at `index`.
