@@ -24,6 +24,24 @@ function(quazor_configure target)
   endif()
 endfunction()
 
+# Parsing the headers that nearly every source includes is a third of a build, so they are parsed once: the first
+# target of a kind keeps the result for the others of its kind.
+function(quazor_precompile target kind)
+  if(NOT QUAZOR_UNITY)
+    return()
+  endif()
+  get_property(owner GLOBAL PROPERTY QUAZOR_HEADERS_OWNER_${kind})
+  if(owner)
+    target_precompile_headers(${target} REUSE_FROM ${owner})
+  else()
+    target_precompile_headers(${target} PRIVATE ${ARGN})
+    set_property(GLOBAL PROPERTY QUAZOR_HEADERS_OWNER_${kind} ${target})
+  endif()
+endfunction()
+
+set(QUAZOR_COMMON_HEADERS <algorithm> <chrono> <cstdint> <filesystem> <functional> <map> <memory> <mutex> <optional>
+                          <sstream> <string> <string_view> <unordered_map> <utility> <variant> <vector>)
+
 # quazor_library(NAME SOURCES ... DEPENDS ...): a folder's own static library, linked as quazor::NAME.
 function(quazor_library name)
   cmake_parse_arguments(ARG "" "" "SOURCES;DEPENDS" ${ARGN})
@@ -32,6 +50,11 @@ function(quazor_library name)
   target_include_directories(quazor_${name} PUBLIC ${PROJECT_SOURCE_DIR})
   target_link_libraries(quazor_${name} PUBLIC ${ARG_DEPENDS})
   quazor_configure(quazor_${name})
+  if("nlohmann_json::nlohmann_json" IN_LIST ARG_DEPENDS)
+    quazor_precompile(quazor_${name} json ${QUAZOR_COMMON_HEADERS} <nlohmann/json.hpp>)
+  else()
+    quazor_precompile(quazor_${name} plain ${QUAZOR_COMMON_HEADERS})
+  endif()
 endfunction()
 
 # quazor_plugin(NAME SOURCES ... DEPENDS ...): a loadable plug-in NAME.so, beside which the host finds it.
@@ -60,14 +83,7 @@ function(quazor_test name)
   target_include_directories(${name} PRIVATE ${PROJECT_SOURCE_DIR})
   target_link_libraries(${name} PRIVATE ${ARG_DEPENDS} GTest::gmock GTest::gtest_main)
   quazor_configure(${name})
-  # Half of a test's compilation is reading these, so they are read once; the first test keeps the result for all.
-  get_property(owner GLOBAL PROPERTY QUAZOR_TEST_HEADERS_OWNER)
-  if(owner)
-    target_precompile_headers(${name} REUSE_FROM ${owner})
-  else()
-    target_precompile_headers(${name} PRIVATE <gmock/gmock.h> <gtest/gtest.h> <nlohmann/json.hpp>)
-    set_property(GLOBAL PROPERTY QUAZOR_TEST_HEADERS_OWNER ${name})
-  endif()
+  quazor_precompile(${name} test ${QUAZOR_COMMON_HEADERS} <gmock/gmock.h> <gtest/gtest.h> <nlohmann/json.hpp>)
   set_target_properties(${name} PROPERTIES RUNTIME_OUTPUT_DIRECTORY ${PROJECT_BINARY_DIR}/tests)
   add_test(NAME ${name} COMMAND ${name} --gtest_brief=1)
 endfunction()

@@ -2,10 +2,13 @@
 
 say() { printf '%s\n' "$*" >&2; }
 
+# Where builds go: build/ of the checkout, or the folder that QUAZOR_BUILD_DIR names.
+build_root=${QUAZOR_BUILD_DIR:-$root/build}
+
 # install_packages PACKAGE...: installs what is missing, on Debian and its kin, after saying so.
 install_packages() {
   if ! command -v dpkg-query >/dev/null 2>&1 || ! command -v apt-get >/dev/null 2>&1; then
-    say "This is no Debian system: if the build fails, install what these Debian packages hold: $*"
+    say "This is not a Debian system: if the build fails, install what these Debian packages hold: $*"
     return 0
   fi
   local missing=() package
@@ -32,15 +35,76 @@ install_packages() {
   rm -f "$log"
 }
 
-# build DIRECTORY TARGETS CMAKE_OPTION...: configures once and builds what has changed; prints only what went wrong.
+# check_cmake: refuses a CMake that is missing or too old, before it complains in its own words.
+check_cmake() {
+  local needed=3.25 found
+  found=$(cmake --version 2>/dev/null | sed -n '1s/.*version \([0-9.]*\).*/\1/p') || true
+  if [ -z "$found" ]; then
+    say "There is no cmake. Install CMake $needed or newer; Debian 12 has it in the package cmake."
+    return 1
+  fi
+  if [ "$(printf '%s\n' "$needed" "$found" | sort -V | head -n 1)" != "$needed" ]; then
+    say "CMake $needed or newer is needed, and $(command -v cmake) is $found. Install a newer one; Debian 12 has it."
+    return 1
+  fi
+}
+
+# claim_build_folder DIRECTORY: makes the folder of a build, or says why that cannot be and what to do instead.
+claim_build_folder() {
+  local directory=$1 elsewhere="Build elsewhere: QUAZOR_BUILD_DIR=/some/folder $0"
+  if ! mkdir -p "$directory" 2>/dev/null; then
+    say "The folder $directory cannot be made: the checkout is read-only, or belongs to somebody else. $elsewhere"
+    return 1
+  fi
+  if [ ! -w "$directory" ] || { [ -e "$directory/build.ninja" ] && [ ! -w "$directory/build.ninja" ]; }; then
+    say "The build in $directory belongs to $(stat -c %U "$directory"), and you may not write there. $elsewhere"
+    return 1
+  fi
+  # CMake refuses a build that was configured for another folder, as after a copy or a move of the checkout.
+  local configured_for
+  configured_for=$(sed -n 's/^CMAKE_HOME_DIRECTORY:INTERNAL=//p' "$directory/CMakeCache.txt" 2>/dev/null) || true
+  if [ -n "$configured_for" ] && [ "$configured_for" != "$root" ]; then
+    say "The build in $directory was made for $configured_for; it is made again for $root."
+    find "$directory" -mindepth 1 -delete
+  fi
+}
+
+# show_progress LOG: copies what ninja prints into the log, and tells how many steps of all are done: in one line of a
+# terminal, elsewhere in a line every 15 s. A build that ends within a second says nothing.
+show_progress() {
+  local line shown=0 told=$SECONDS begin=$SECONDS
+  while IFS= read -r line; do
+    printf '%s\n' "$line" >>"$1"
+    [[ $line =~ ^\[([0-9]+)/([0-9]+)\] ]] || continue
+    if [ -t 2 ]; then
+      if [ $SECONDS -gt $begin ]; then
+        printf '\rBuilding: %d of %d steps\033[K' "${BASH_REMATCH[1]}" "${BASH_REMATCH[2]}" >&2
+        shown=1
+      fi
+    elif [ $((SECONDS - told)) -ge 15 ]; then
+      say "Building: ${BASH_REMATCH[1]} of ${BASH_REMATCH[2]} steps after $((SECONDS - begin)) s"
+      told=$SECONDS
+    fi
+  done
+  [ $shown -eq 0 ] || printf '\r\033[K' >&2
+}
+
+# build DIRECTORY TARGETS CMAKE_OPTION...: configures once and builds what has changed, with progress; prints its output
+# only when it fails.
 build() {
   local directory=$1 targets=$2
   shift 2
-  local log
+  check_cmake || return 1
+  claim_build_folder "$directory" || return 1
+  local log lock
+  exec {lock}>"$directory/.building"
+  if ! flock --nonblock "$lock"; then
+    say "Another build is at work in $directory; waiting for it."
+    flock "$lock"
+  fi
   log=$(mktemp)
   if [ ! -f "$directory/build.ninja" ]; then
     say "Building in ${directory#"$root"/} (once; this takes some minutes)"
-    mkdir -p "$directory"
     if ! cmake -S "$root" -B "$directory" -G Ninja "$@" >"$log" 2>&1; then
       cat "$log" >&2
       rm -f "$log" "$directory/build.ninja"
@@ -48,10 +112,11 @@ build() {
     fi
   fi
   # shellcheck disable=SC2086  # several targets are several words
-  if ! cmake --build "$directory" --target $targets >"$log" 2>&1; then
+  if ! (set -o pipefail; cmake --build "$directory" --target $targets 2>&1 | show_progress "$log"); then
     cat "$log" >&2
     rm -f "$log"
     return 1
   fi
   rm -f "$log"
+  exec {lock}>&-
 }
