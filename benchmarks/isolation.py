@@ -43,18 +43,18 @@ def lines_in(record):
     return count
 
 
-def measure(build):
+def measure(build, quick=False):
     """The medians: "child", "in process" and "list" in seconds, "lines" a second; and the lines that were "lost".
     Nothing when a command fails."""
     print("running isolation ...", flush=True)
     try:
-        return measured(build)
+        return measured(build, 1 if quick else REPETITIONS, 1 if quick else FLOODS)
     except subprocess.CalledProcessError as failure:
         print(f"{failure}: {failure.stderr.decode(errors='replace')}")
         return {}
 
 
-def measured(build):
+def measured(build, repetitions, floods):
     program = str(pathlib.Path(build) / "bin" / "quazor")
     flood = [program, "run", "LogFlood", "--plugin", str(pathlib.Path(build) / "benchmarks" / "log_flood.so")]
     commands = {
@@ -64,13 +64,13 @@ def measured(build):
     }
     with tempfile.TemporaryDirectory() as state:
         seconds = {name: [] for name in commands}
-        for _ in range(REPETITIONS):
+        for _ in range(repetitions):
             for name, command in commands.items():
                 seconds[name].append(seconds_of(command, state))
         medians = {name: statistics.median(times) for name, times in seconds.items()}
         rates, medians["lost"] = [], 0
         record = os.path.join(state, "record.jsonl")
-        for _ in range(FLOODS):
+        for _ in range(floods):
             empty = seconds_of([*flood, "--record", record, "--set", "count=0"], state)
             full = seconds_of([*flood, "--record", record, "--set", f"count={LINES}"], state)
             rates.append(LINES / (full - empty))

@@ -1,23 +1,27 @@
 #!/usr/bin/env python3
 """Runs the benchmarks, compares what has a requirement, and tells the result in the exit code.
 
-usage: run.py DIRECTORY PLUG-IN
+DIRECTORY holds the benchmark programs, in a build directory. Every program runs its benchmarks several times, in random
+order, so that what else the machine does meets all of them alike; the medians are compared. A benchmark without a
+figure counts as a missed requirement. Exit code 0: all requirements are met; 1: one is missed; 2: wrong use.
 
-DIRECTORY holds the benchmark programs, in a build directory. Every program runs its benchmarks several times, in random order, so that
-what else the machine does meets all of them alike; the medians are compared. A requirement that could not be measured
-counts as missed. Exit code 0: all requirements are met; 1: one is missed; 2: wrong use.
+--quick runs every benchmark once and shortly. It checks that each has a figure, and judges none: too short to be judged,
+and any machine will do. Exit code 0: all have a figure; 1: one has none; 2: wrong use.
 """
 
+import argparse
 import json
 import os
 import subprocess
 import sys
 
 from isolation import check_isolation, measure as measure_isolation
-from requirements import Requirements
+from requirements import Figures, Requirements
 
-REPETITIONS = 7
-PEERS = ("asio strand", "asio pool", "tbb node")
+FULL = ("--benchmark_repetitions=7", "--benchmark_enable_random_interleaving=true",
+        "--benchmark_report_aggregates_only=true")
+QUICK = ("--benchmark_min_time=0.001",)
+PEERS = ("asio strand", "asio pool", "tbb node", "moodycamel bulk")
 RUN_LOOPS = (("wake_ups", "wake-ups of two threads by each other"), ("signals", "signals from another thread"),
              ("stopped_runs", "runs that a source stops"))
 LINES = ("received frame", "event", "format index", "device supports", "session status")
@@ -25,21 +29,35 @@ LINES = ("received frame", "event", "format index", "device supports", "session 
 WAKE_UP_NOISE = 1.10
 
 
-def run(directory, program, *arguments):
-    """Runs a program; returns the medians of its benchmarks by name."""
-    command = [os.path.join(directory, program), *arguments, f"--benchmark_repetitions={REPETITIONS}",
-               "--benchmark_enable_random_interleaving=true", "--benchmark_report_aggregates_only=true",
-               "--benchmark_format=json"]
-    print(f"running {program} ...", flush=True)
-    done = subprocess.run(command, stdout=subprocess.PIPE, text=True, check=False)
-    if done.returncode != 0:
-        print(f"{program} ended with exit code {done.returncode}")
-        return {}
-    medians = {}
-    for entry in json.loads(done.stdout)["benchmarks"]:
-        if entry.get("aggregate_name") == "median":
-            medians[entry["run_name"]] = entry
-    return medians
+class Programs:
+    """Runs the benchmark programs of a directory, once and shortly where `quick`."""
+
+    def __init__(self, directory, quick):
+        self.directory = directory
+        self.options = QUICK if quick else FULL
+        self.kind = "iteration" if quick else "median"
+        self.missing = []  # the benchmarks that have ended without a figure
+
+    def run(self, program, *arguments):
+        """The medians of a program's benchmarks by name; when quick, their only figures."""
+        print(f"running {program} ...", flush=True)
+        command = [os.path.join(self.directory, program), *arguments]
+        names = self.output([*command, "--benchmark_list_tests=true"]).split("\n")[:-1]
+        output = self.output([*command, *self.options, "--benchmark_format=json"])
+        figures = {}
+        for entry in json.loads(output)["benchmarks"] if output else ():
+            if self.kind in (entry["run_type"], entry.get("aggregate_name")) and not entry.get("error_occurred"):
+                figures[entry["run_name"]] = entry
+        self.missing += [f"{program}: {name}" for name in names if name not in figures] if names else [program]
+        return figures
+
+    def output(self, command):
+        """What a command writes; nothing when it fails."""
+        done = subprocess.run(command, stdout=subprocess.PIPE, text=True, check=False)
+        if done.returncode != 0:
+            print(f"{os.path.basename(command[0])} ended with exit code {done.returncode}")
+            return ""
+        return done.stdout
 
 
 def check_serial_queue(requirements, medians):
@@ -151,24 +169,31 @@ def check_channels(requirements, medians):
 
 
 def main():
-    if len(sys.argv) != 3:
-        print(__doc__)
-        return 2
-    directory, plugin = sys.argv[1:]
+    parser = argparse.ArgumentParser(usage="run.py [--quick] DIRECTORY PLUG-IN", description=__doc__,
+                                     formatter_class=argparse.RawDescriptionHelpFormatter)
+    parser.add_argument("--quick", action="store_true")
+    parser.add_argument("directory")
+    parser.add_argument("plugin")
+    arguments = parser.parse_args()
+    programs = Programs(arguments.directory, arguments.quick)
+    empty = os.path.join(arguments.directory, "empty_shared_object.so")
+    build = os.path.dirname(os.path.abspath(arguments.directory))
     results = (
-        (check_serial_queue, run(directory, "serial_queue_benchmark")),
-        (check_run_loop, run(directory, "run_loop_benchmark")),
-        (check_log, run(directory, "log_benchmark")),
-        (check_messages, run(directory, "message_format_benchmark")),
-        (check_sensor_images, run(directory, "sensor_images_benchmark")),
-        (check_load, run(directory, "load_benchmark", plugin, os.path.join(directory, "empty_shared_object.so"))),
-        (check_pipeline, run(directory, "projector_pipeline_benchmark")),
-        (check_channels, run(directory, "report_channels_benchmark")),
-        (check_isolation, measure_isolation(os.path.dirname(os.path.abspath(directory)))),
+        (check_serial_queue, programs.run("serial_queue_benchmark")),
+        (check_run_loop, programs.run("run_loop_benchmark")),
+        (check_log, programs.run("log_benchmark")),
+        (check_messages, programs.run("message_format_benchmark")),
+        (check_sensor_images, programs.run("sensor_images_benchmark")),
+        (check_load, programs.run("load_benchmark", arguments.plugin, empty)),
+        (check_pipeline, programs.run("projector_pipeline_benchmark")),
+        (check_channels, programs.run("report_channels_benchmark")),
+        (check_isolation, measure_isolation(build, arguments.quick)),
     )
-    requirements = Requirements()
+    requirements = Figures() if arguments.quick else Requirements()
     for check, medians in results:
         check(requirements, medians)
+    for name in programs.missing:
+        requirements.miss(f"no figure of {name}")
     return requirements.exit_code()
 
 

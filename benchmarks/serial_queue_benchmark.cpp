@@ -93,6 +93,7 @@ int main(int argc, char** argv) {
   quazor::registerQueue<quazor::AsioStrand>("asio strand");
   quazor::registerQueue<quazor::AsioPool>("asio pool");
   quazor::registerQueue<quazor::TbbNode>("tbb node");
+  quazor::registerQueue<quazor::MoodycamelBulk>("moodycamel bulk");
   quazor::registerQueue<quazor::MutexQueue>("mutex queue");
   benchmark::Initialize(&argc, argv);
   if (benchmark::ReportUnrecognizedArguments(argc, argv)) return 2;

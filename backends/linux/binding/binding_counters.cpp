@@ -20,12 +20,13 @@ constexpr std::size_t kMaxPathLength = 4095;  // PATH_MAX of linux/limits.h with
 
 struct Part {
   std::string_view key;
+  std::string_view placeholder;
   std::optional<std::string> CounterFilesBinding::*text;
 };
 
-constexpr std::array<Part, 3> kParts{{{"group", &CounterFilesBinding::group},
-                                      {"subgroup", &CounterFilesBinding::subgroup},
-                                      {"name", &CounterFilesBinding::name}}};
+constexpr std::array<Part, 3> kParts{{{"group", "{group}", &CounterFilesBinding::group},
+                                      {"subgroup", "{subgroup}", &CounterFilesBinding::subgroup},
+                                      {"name", "{name}", &CounterFilesBinding::name}}};
 
 NamePattern patternIn(const JsonCursor& cursor) {
   std::string problem;
@@ -57,8 +58,7 @@ std::optional<std::string> findText(const JsonCursor& cursor, std::string_view k
 std::optional<std::string> findPart(const JsonCursor& cursor, std::string_view key) {
   std::optional<std::string> text = findText(cursor, key);
   for (const Part& part : kParts) {
-    const std::string placeholder = "{" + std::string(part.key) + "}";
-    if (!text || text->find(placeholder) == std::string::npos) continue;
+    if (!text || text->find(part.placeholder) == std::string::npos) continue;
     cursor.at(key).fail("a placeholder stands for something in the path only; give the " + std::string(key) +
                         " as it is.");
   }
@@ -80,7 +80,7 @@ CounterFilesBinding readCounterFiles(const JsonCursor& cursor) {
   for (const Part& part : kParts) {
     const bool inPath = path.hasPlaceholder(part.key);
     const bool inKey = keyIsName && part.key == "name";
-    const std::string placeholder = "\"{" + std::string(part.key) + "}\"";
+    const std::string placeholder = inQuotes(part.placeholder);
     files.*(part.text) = findPart(cursor, part.key);
     if (inPath && inKey) cursor.at("key").fail("\"{name}\" stands in the path already; leave one.");
     if ((inPath || inKey) && files.*(part.text)) {
