@@ -4,10 +4,10 @@
 #include "backends/threads/thread_serial_queue.h"
 #include "platform/task.h"
 
+#include <concurrentqueue/blockingconcurrentqueue.h>
 #include <tbb/flow_graph.h>
 #include <tbb/global_control.h>
 #include <asio.hpp>
-#include <concurrentqueue/blockingconcurrentqueue.h>
 
 #include <array>
 #include <condition_variable>

@@ -3,6 +3,7 @@
 #include <gtest/gtest.h>
 
 #include <string>
+#include <utility>
 #include <vector>
 
 namespace quazor {
@@ -83,6 +84,27 @@ TEST(OrderedMapTest, TheLastOfEqualKeysInAListHolds) {
   const Counts map{{"a", 1}, {"b", 2}, {"a", 3}};
   EXPECT_EQ(keysOf(map), (std::vector<std::string>{"a", "b"}));
   EXPECT_EQ(*map.find("a"), 3);
+}
+
+TEST(OrderedMapTest, SettingAllIsSettingOneBehindTheOther) {
+  for (const int size : kSizes) {
+    for (const int earlier : {0, 3, 20}) {
+      // Every third key comes twice, and some were there before.
+      std::vector<std::pair<std::string, int>> elements;
+      for (int i = 0; i < size; ++i) {
+        elements.emplace_back(keyOf(i), 100 + i);
+        if (i % 3 == 0) elements.emplace_back(keyOf(i / 2), 2000 + i);
+      }
+      Counts expected = mapOf(earlier);
+      for (const auto& [key, value] : elements) expected.set(key, value);
+      Counts map = mapOf(earlier);
+      map.setAll(
+          elements, [](const auto& element) -> const std::string& { return element.first; },
+          [](const auto& element) { return element.second; });
+      EXPECT_EQ(keysOf(map), keysOf(expected)) << size << " to " << earlier;
+      EXPECT_EQ(map, expected) << size << " to " << earlier;
+    }
+  }
 }
 
 TEST(OrderedMapTest, ErasingTakesOneEntryAndLeavesTheOthersInOrder) {

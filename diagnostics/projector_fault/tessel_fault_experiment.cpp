@@ -7,6 +7,7 @@
 #include "platform/capture_keys.h"
 
 #include <optional>
+#include <string>
 #include <string_view>
 #include <utility>
 #include <vector>
@@ -223,7 +224,6 @@ std::unique_ptr<QZExperimentResult> QZTesselFaultExperiment::_buildResult() cons
   auto result = std::make_unique<QZExperimentResult>();
   OrderedMap<Measurement>& measurements = result->measurements();
   const std::vector<ReportSample>& samples = _telemonDelta->samples();
-  measurements.reserve(7 + samples.size());
   measurements.set("FrameCount", Measurement(static_cast<double>(_frameCount.load()), QZDimensionlessUnit::frames()));
   if (_errorCounters) {
     const auto setCounter = [&](std::string_view name, std::string_view key) {
@@ -237,11 +237,12 @@ std::unique_ptr<QZExperimentResult> QZTesselFaultExperiment::_buildResult() cons
     setCounter("Projector", "ProjectorErrorCount");
   }
   // A channel may bear one of the names above; its count then stands.
-  for (const ReportSample& sample : samples) {
-    const ReportChannel& channel = sample.channel();
-    measurements.set(channel.channelDescription().name,
-                     Measurement(toDouble(pointerTo(channel.count())), QZDimensionlessUnit::events()));
-  }
+  measurements.setAll(
+      samples,
+      [](const ReportSample& sample) -> const std::string& { return sample.channel().channelDescription().name; },
+      [](const ReportSample& sample) {
+        return Measurement(toDouble(pointerTo(sample.channel().count())), QZDimensionlessUnit::events());
+      });
   return result;
 }
 

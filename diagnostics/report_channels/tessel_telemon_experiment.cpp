@@ -3,6 +3,7 @@
 #include "diagnostics/report_channels/channel_filters.h"
 
 #include <cstdint>
+#include <string>
 #include <utility>
 #include <vector>
 
@@ -36,16 +37,18 @@ std::unique_ptr<QZExperimentResult> QZTesselTelemonExperiment::run(DiagnosticErr
     return nullptr;
   }
   const std::vector<ReportSample>& samples = snapshot->samples();
-  result->measurements().reserve(samples.size());
   for (const ReportSample& sample : samples) {
-    const std::string& name = sample.channel().channelDescription().name;
-    const std::optional<Value>& count = sample.channel().count();
-    if (!count) {
-      fail(error, QZTelemonErrorDomain, kReportFailure, nullptr, "Could not get the count of %@.", name);
-      return nullptr;
-    }
-    result->measurements().set(name, Measurement(toDouble(&*count), QZDimensionlessUnit::events()));
+    if (sample.channel().count()) continue;
+    fail(error, QZTelemonErrorDomain, kReportFailure, nullptr, "Could not get the count of %@.",
+         sample.channel().channelDescription().name);
+    return nullptr;
   }
+  result->measurements().setAll(
+      samples,
+      [](const ReportSample& sample) -> const std::string& { return sample.channel().channelDescription().name; },
+      [](const ReportSample& sample) {
+        return Measurement(toDouble(&*sample.channel().count()), QZDimensionlessUnit::events());
+      });
   return result;
 }
 
