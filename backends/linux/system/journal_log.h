@@ -18,6 +18,10 @@ namespace quazor {
 // fields MESSAGE, PRIORITY (a level of syslog(3)), SYSLOG_IDENTIFIER ("quazor"), SUBSYSTEM and CATEGORY. Texts go as
 // they are: of any length, with line breaks, and also bytes that are no UTF-8, which journalctl shows with --all only.
 //
+// libsystemd's sd_journal_sendv() is not used because, measured with version 252, it blocks for as long as a journal
+// does not read and returns success where there is no journal, so that lines could neither be dropped nor go to the
+// fallback.
+//
 // Each line is tried anew, so a journal that is restarted is found again. A journal that has stopped reading costs one
 // line a tenth of a second; from then on lines that it does not take at once are dropped, and their number is told
 // when it takes lines again.
