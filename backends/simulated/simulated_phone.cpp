@@ -1,6 +1,7 @@
 #include "backends/simulated/simulated_phone.h"
 
 #include "backends/simulated/capture/simulated_capture.h"
+#include "backends/simulated/counters/intercepted_reports.h"
 #include "backends/simulated/counters/simulated_reports.h"
 #include "backends/simulated/display/simulated_framebuffer.h"
 #include "backends/simulated/hid/simulated_hid.h"
@@ -101,7 +102,7 @@ void SimulatedPhone::build(const Scenario& scenario, const std::shared_ptr<Clock
   calls_ = std::make_shared<CallInterceptor>(scenario.faults, clock, std::move(hang));
   hardware_ = std::make_shared<CaptureHardware>(scenario, clock, concurrency);
   platform_.capture = std::make_shared<SimulatedCaptureService>(hardware_, calls_);
-  platform_.reports = std::make_shared<SimulatedReportFacility>(scenario.reports, hardware_, calls_);
+  platform_.reports = interceptReports(makeSimulatedReports(scenario.reports, hardware_), calls_);
   platform_.hid = std::make_shared<SimulatedHidService>(scenario.hidDevices, clock, *concurrency, calls_);
   platform_.framebuffer = std::make_shared<SimulatedFramebufferService>(scenario.display, calls_);
   platform_.runLoops = std::make_shared<InterceptedRunLoops>(std::move(runLoops), calls_);

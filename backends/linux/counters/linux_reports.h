@@ -11,10 +11,9 @@ namespace quazor {
 
 // Channels are looked for anew at every call of reportWithOnlySimpleChannels(); docs/linux.md says which there are.
 //
-// Counts are unsigned. A channel whose file has gone, or holds no whole number of at most 64 bits, has no count. A
-// delta is taken between snapshots of the same channels of one such call; it is negative for a number that went down,
-// which was reset or is no counter, and no count where one of the two has none. A tracepoint counts from the first
-// snapshot of a set that it is in; its count there is of the time since it was opened, about 0.
+// A channel whose file has gone, or holds no whole number of at most 64 bits, has no count; differences are those of
+// makeCounterReports(). A tracepoint counts from the first snapshot of a set that it is in; its count there is of the
+// time since it was opened, about 0.
 //
 // Errors: LinuxErrorDomain. What may not be looked at or read (kNoAccess) fails the call.
 // Thread: any.
