@@ -1,5 +1,6 @@
 #include "backends/simulated/simulated_phone.h"
 
+#include "backends/simulated/calls/injected_error.h"
 #include "backends/simulated/capture/simulated_capture.h"
 #include "backends/simulated/counters/intercepted_reports.h"
 #include "backends/simulated/counters/simulated_reports.h"
@@ -58,12 +59,6 @@ class InterceptedRunLoops final : public RunLoops {
   const std::shared_ptr<CallInterceptor> calls_;
 };
 
-CallInterceptor::Hang sleepForEver(std::shared_ptr<Clock> clock) {
-  return [clock = std::move(clock)](std::string_view) {
-    for (;;) clock->sleep(std::chrono::nanoseconds::max());
-  };
-}
-
 }  // namespace
 
 SimulatedPhone::SimulatedPhone(const Scenario& scenario, PhoneTime time, std::uint64_t seed) {
@@ -99,7 +94,7 @@ void SimulatedPhone::buildVirtual(const Scenario& scenario, std::shared_ptr<Virt
 void SimulatedPhone::build(const Scenario& scenario, const std::shared_ptr<Clock>& clock,
                            std::shared_ptr<Concurrency> concurrency, std::shared_ptr<RunLoops> runLoops,
                            CallInterceptor::Hang hang) {
-  calls_ = std::make_shared<CallInterceptor>(scenario.faults, clock, std::move(hang));
+  calls_ = std::make_shared<CallInterceptor>(scenario.faults, clock, std::move(hang), simulatedInjectedError);
   hardware_ = std::make_shared<CaptureHardware>(scenario, clock, concurrency);
   platform_.capture = std::make_shared<SimulatedCaptureService>(hardware_, calls_);
   platform_.reports = interceptReports(makeSimulatedReports(scenario.reports, hardware_), calls_);

@@ -1,9 +1,9 @@
 // SimulatedPhone: a whole phone behind the platform's services, as a scenario describes it.
 #pragma once
 
-#include "backends/simulated/calls/call_interceptor.h"
+#include "backends/faults/call_interceptor.h"
+#include "backends/faults/fault.h"
 #include "backends/simulated/capture/capture_hardware.h"
-#include "backends/simulated/scenario/fault.h"
 #include "backends/simulated/scenario/scenario.h"
 #include "backends/simulated/time/virtual_scheduler.h"
 #include "platform/platform.h"

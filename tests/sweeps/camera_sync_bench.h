@@ -1,7 +1,7 @@
 // A simulated phone to run camera synchronisation on, and what healthy runs on it look like.
 #pragma once
 
-#include "backends/simulated/scenario/fault.h"
+#include "backends/faults/fault.h"
 #include "backends/simulated/scenario/scenario.h"
 #include "tests/support/run_transcript.h"
 

@@ -1,6 +1,6 @@
 #include "tests/sweeps/projector_bench.h"
 
-#include "backends/simulated/scenario/report_operations.h"
+#include "backends/faults/operations.h"
 #include "backends/simulated/simulated_phone.h"
 #include "diagnostics/projector_fault/tessel_fault_experiment.h"
 #include "platform/capture_keys.h"

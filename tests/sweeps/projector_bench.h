@@ -1,7 +1,7 @@
 // A simulated phone to run the projector fault experiment on, and all that can be seen of such a run.
 #pragma once
 
-#include "backends/simulated/scenario/fault.h"
+#include "backends/faults/fault.h"
 #include "backends/simulated/scenario/scenario.h"
 #include "contract/value.h"
 #include "tests/support/run_transcript.h"

@@ -1,7 +1,7 @@
 // Makes every call of a capture of sensor images go wrong in every way, and every two calls, and compares each run to
 // the last word with what the oracle says it must be.
+#include "backends/faults/operations.h"
 #include "backends/simulated/scenario/scenario.h"
-#include "backends/simulated/scenario/sensor_operations.h"
 #include "tests/support/run_transcript.h"
 #include "tests/sweeps/sensor_images_bench.h"
 #include "tests/sweeps/sensor_images_oracle.h"
@@ -274,7 +274,8 @@ TEST_P(SensorImagesSweep, EveryCallMayGoWrong) {
 }
 
 TEST_P(SensorImagesSweep, EveryOperationMayGoWrongAtEachOccurrenceAndAlways) {
-  for (const SensorOperation& operation : kSensorOperations) {
+  for (const Operation& operation : kOperations) {
+    if (operation.service != OperationService::kSensors) continue;
     const std::string name(operation.name);
     std::uint64_t occurrences = 0;
     for (const Prediction& prediction : runs.predict({{{"", FaultAction::kDelay}, {}, name}})) {

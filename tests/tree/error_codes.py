@@ -256,7 +256,7 @@ class Collector:
     def _is_passed_on(source, domain, code):
         """A scenario's error: its author chose domain and code."""
         texts = ["".join(token.text for token in argument) for argument in (domain, code)]
-        return (source.name.startswith("backends/simulated/") and texts[0].endswith(".error->domain")
+        return (source.name.startswith(("backends/faults/", "backends/simulated/")) and texts[0].endswith(".error->domain")
                 and texts[1] == texts[0][:-len("domain")] + "code")
 
     @staticmethod

@@ -97,8 +97,9 @@ class KnownFormTest(unittest.TestCase):
 
     def test_a_scenarios_error_is_passed_on(self):
         text = "P f() { return errorWithMessage(fault.error->domain, fault.error->code, text, nullptr); }"
-        files = {"backends/simulated/scenario/fault.cpp": text}
-        self.assertEqual(in_tree(files, lambda root: error_codes.errors_of(root, ["backends/simulated"])), [])
+        for file in ("backends/faults/fault.cpp", "backends/simulated/hid/sensor.cpp"):
+            with self.subTest(file):
+                self.assertEqual(in_tree({file: text}, lambda root: error_codes.errors_of(root, ["backends"])), [])
 
 
 class UnknownFormTest(unittest.TestCase):

@@ -39,17 +39,20 @@ ALLOWED = {
     "diagnostics/sensor_images": CONTRACT,
     "plugins": [*CONTRACT, *DIAGNOSTICS],
     "backends/threads": CONTRACT,
+    "backends/faults": [*CONTRACT, "base/json", "base/text"],
     "backends/counters": CONTRACT,
     "backends/hid": CONTRACT,
     SIMULATED + "time": [*CONTRACT, "backends/threads"],
-    SIMULATED + "scenario": [*CONTRACT, "base/json", "base/text"],
-    SIMULATED + "calls": [*CONTRACT, SIMULATED + "scenario"],
-    SIMULATED + "capture": [*CONTRACT, SIMULATED + "calls", SIMULATED + "scenario"],
-    SIMULATED + "counters": [*CONTRACT, "backends/counters", SIMULATED + "calls", SIMULATED + "capture", SIMULATED + "scenario"],
-    SIMULATED + "display": [*CONTRACT, SIMULATED + "calls", SIMULATED + "scenario"],
-    SIMULATED + "hid": [*CONTRACT, "backends/hid", SIMULATED + "calls", SIMULATED + "capture", SIMULATED + "scenario"],
+    SIMULATED + "scenario": [*CONTRACT, "backends/faults", "base/json", "base/text"],
+    SIMULATED + "calls": [*CONTRACT, "backends/faults", SIMULATED + "scenario"],
+    SIMULATED + "capture": [*CONTRACT, "backends/faults", SIMULATED + "calls", SIMULATED + "scenario"],
+    SIMULATED + "counters": [*CONTRACT, "backends/counters", "backends/faults", SIMULATED + "calls", SIMULATED + "capture",
+                             SIMULATED + "scenario"],
+    SIMULATED + "display": [*CONTRACT, "backends/faults", SIMULATED + "calls", SIMULATED + "scenario"],
+    SIMULATED + "hid": [*CONTRACT, "backends/faults", "backends/hid", SIMULATED + "calls", SIMULATED + "capture",
+                        SIMULATED + "scenario"],
     LINUX + "system": [*CONTRACT, "backends/threads"],
-    LINUX + "binding": [*CONTRACT, "base/json", "base/text"],
+    LINUX + "binding": [*CONTRACT, "backends/faults", "base/json", "base/text"],
     LINUX + "video": [*CONTRACT, LINUX + "binding", LINUX + "system"],
     LINUX + "capture": [*CONTRACT, LINUX + "binding", LINUX + "system", LINUX + "video"],
     LINUX + "hid": [*CONTRACT, "backends/hid", LINUX + "system"],
@@ -64,8 +67,8 @@ def parts(folder):
 
 
 ALLOWED[LINUX + "probe"] = [*CONTRACT, *parts("backends/linux")]
-ALLOWED["backends/simulated"] = [*CONTRACT, "backends/threads", *parts("backends/simulated")]
-ALLOWED["backends/linux"] = [*CONTRACT, "backends/threads", *parts("backends/linux")]
+ALLOWED["backends/simulated"] = [*CONTRACT, "backends/faults", "backends/threads", *parts("backends/simulated")]
+ALLOWED["backends/linux"] = [*CONTRACT, "backends/faults", "backends/threads", *parts("backends/linux")]
 BACKENDS = [name for name in ALLOWED if name.startswith("backends/")]
 
 # The host's folders, lower ones first: each may include only those before it.
@@ -88,6 +91,7 @@ STANDARD_LIBRARY_ONLY = [*CONTRACT, "base/text", *DIAGNOSTICS]
 TEST_ALLOWED = {
     "diagnostics": BACKENDS,
     "plugins": BACKENDS,
+    "backends/faults": ["backends/threads", SIMULATED + "time"],
     "backends/simulated": ["backends/threads", "backends/simulated", *parts("backends/simulated")],
     "backends/linux": ["backends/threads", "backends/linux", *parts("backends/linux")],
     "host": ["host", *parts("host"), *BACKENDS],

@@ -1,7 +1,7 @@
 // What the objects of one capture device share.
 #pragma once
 
-#include "backends/simulated/calls/call_interceptor.h"
+#include "backends/faults/call_interceptor.h"
 #include "backends/simulated/capture/capture_hardware.h"
 
 #include <memory>

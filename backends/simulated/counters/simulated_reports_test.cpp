@@ -150,7 +150,9 @@ TEST_F(SimulatedReportsTest, FaultsReachWhatCanFail) {
   make({channel("A", "s", "x", 1)});
   const Set set = simple();
   const Snapshot snapshot = set->snapshot(nullptr);
-  for (const std::string_view operation : kReportOperations) fault(std::string(operation));
+  for (const Operation& operation : kOperations) {
+    if (operation.service == OperationService::kReports) fault(std::string(operation.name));
+  }
   const auto injected = [](const std::string& what) {
     return reportRefusal(ReportErrorCode::kInjected, what + " failed.");
   };

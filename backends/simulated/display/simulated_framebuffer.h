@@ -1,7 +1,7 @@
 // The framebuffer service of the simulated phone.
 #pragma once
 
-#include "backends/simulated/calls/call_interceptor.h"
+#include "backends/faults/call_interceptor.h"
 #include "backends/simulated/scenario/display_config.h"
 #include "platform/framebuffer_service.h"
 

@@ -1,7 +1,7 @@
 // The HID service of the simulated phone.
 #pragma once
 
-#include "backends/simulated/calls/call_interceptor.h"
+#include "backends/faults/call_interceptor.h"
 #include "backends/simulated/hid/hid_sensor.h"
 #include "backends/simulated/scenario/hid_config.h"
 #include "platform/clock.h"

@@ -1,7 +1,7 @@
 // What a scenario says of a HID device.
 #pragma once
 
-#include "backends/simulated/scenario/fault.h"
+#include "backends/faults/fault.h"
 
 #include <cstdint>
 #include <map>

@@ -9,8 +9,8 @@ std::span<const CaptureProperty> propertiesOf(CaptureObjectKind kind) {
     case CaptureObjectKind::kDevice: return kDeviceProperties;
     case CaptureObjectKind::kGroup: return kGroupProperties;
     case CaptureObjectKind::kStream: return kStreamProperties;
-    default: return {};
   }
+  return {};
 }
 
 const CaptureProperty* findProperty(CaptureObjectKind kind, std::string_view key) {

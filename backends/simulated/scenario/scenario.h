@@ -1,8 +1,8 @@
 // Scenario: a whole simulated phone, as data. data/scenarios/scenario.schema.json describes the files.
 #pragma once
 
+#include "backends/faults/fault.h"
 #include "backends/simulated/scenario/display_config.h"
-#include "backends/simulated/scenario/fault.h"
 #include "backends/simulated/scenario/frame_config.h"
 #include "backends/simulated/scenario/hid_config.h"
 #include "backends/simulated/scenario/report_config.h"

@@ -1,11 +1,11 @@
 #include "backends/simulated/scenario/scenario_content.h"
 
+#include "backends/faults/fault_reader.h"
+#include "backends/faults/hid_report_name.h"
 #include "backends/simulated/scenario/property_table.h"
-#include "backends/simulated/scenario/report_operations.h"
 #include "backends/simulated/scenario/scenario_frames.h"
 #include "backends/simulated/scenario/scenario_parts.h"
 #include "backends/simulated/scenario/scenario_sensors.h"
-#include "backends/simulated/scenario/sensor_operations.h"
 
 #include <algorithm>
 #include <array>
@@ -20,7 +20,6 @@ namespace {
 using Names = std::vector<std::string_view>;
 
 constexpr std::uint64_t kMaxFrames = 1'000'000'000;
-constexpr double kMaxDelay = 1e9;
 
 bool booleanOr(const JsonCursor& object, std::string_view key, bool otherwise) {
   const std::optional<JsonCursor> entry = object.find(key);
@@ -40,12 +39,6 @@ void checkId(const std::string& id, const JsonCursor& cursor) {
 Names idsOf(const std::vector<Camera>& cameras) {
   Names ids;
   for (const Camera& camera : cameras) ids.push_back(camera.id);
-  return ids;
-}
-
-Names idsOf(const std::vector<CameraGroup>& groups) {
-  Names ids;
-  for (const CameraGroup& group : groups) ids.push_back(group.id);
   return ids;
 }
 
@@ -134,85 +127,32 @@ CameraGroup readGroup(const std::string& id, const JsonCursor& cursor, const Sce
 std::optional<FaultError> readOptionalError(const JsonCursor& object, std::string_view key) {
   const std::optional<JsonCursor> entry = object.find(key);
   if (!entry || entry->isNull()) return std::nullopt;
-  return readError(*entry);
+  return readFaultError(*entry);
 }
 
-// What the selectors of a fault may name: those of one operation, or of all together.
-struct Selectable {
-  Names objects;
-  Names properties;
-
-  void add(const CaptureOperation& operation, const Scenario& scenario) {
-    if (operation.on == CaptureObjectKind::kStream) append(objects, idsOf(scenario.cameras));
-    if (operation.on == CaptureObjectKind::kGroup) append(objects, idsOf(scenario.groups));
-    if (!operation.hasProperty) return;
-    for (const CaptureProperty& property : propertiesOf(operation.on)) append(properties, {property.key});
-  }
-  void add(const SensorOperation& operation, const Scenario& scenario) {
-    for (const HidDeviceConfig& device : scenario.hidDevices) {
-      if (operation.onDevice) append(objects, {device.name});
-      if (operation.property != SensorProperty::kFeatureReport) continue;
-      for (const HidFeatureReport& report : device.featureReports) append(properties, {hidReportName(report.id)});
-    }
-    if (operation.property != SensorProperty::kRegistryProperty) return;
-    for (const auto& [name, value] : scenario.display.properties) append(properties, {name});
-  }
-
- private:
-  static void append(Names& to, const Names& names) {
-    for (const std::string_view name : names) {
-      if (std::ranges::find(to, name) == to.end()) to.push_back(name);
-    }
-  }
-};
-
-void readSelectors(const JsonCursor& cursor, const Scenario& scenario, Fault& fault) {
-  Names operations{"*"};
-  for (const CaptureOperation& operation : kCaptureOperations) operations.push_back(operation.name);
-  operations.insert(operations.end(), kReportOperations.begin(), kReportOperations.end());
-  for (const SensorOperation& operation : kSensorOperations) operations.push_back(operation.name);
-  fault.operation = cursor.at("operation").oneOf(operations, "an operation that can fail");
-
-  Selectable selectable;
-  for (const CaptureOperation& operation : kCaptureOperations) {
-    if (fault.operation == "*" || fault.operation == operation.name) selectable.add(operation, scenario);
-  }
-  for (const SensorOperation& operation : kSensorOperations) {
-    if (fault.operation == "*" || fault.operation == operation.name) selectable.add(operation, scenario);
-  }
-  if (const auto object = cursor.find("object")) {
-    if (selectable.objects.empty())
-      object->fail(fault.operation + " is not called on a camera, a group or a HID device; leave it out.");
-    fault.object = object->oneOf(selectable.objects, "an object of " + fault.operation);
-  }
-  if (const auto property = cursor.find("property")) {
-    if (selectable.properties.empty()) property->fail(fault.operation + " is about no property; leave it out.");
-    fault.property = property->oneOf(selectable.properties, "a property of " + fault.operation);
-  }
-  if (const auto occurrence = cursor.find("occurrence")) fault.occurrence = occurrence->integer(1, kMaxFrames);
+std::vector<std::string> keysOf(CaptureObjectKind kind) {
+  std::vector<std::string> keys;
+  for (const CaptureProperty& property : propertiesOf(kind)) keys.emplace_back(property.key);
+  return keys;
 }
 
-Fault readFault(const JsonCursor& cursor, const Scenario& scenario) {
-  constexpr std::array kActions{FaultAction::kFail, FaultAction::kNothing, FaultAction::kHang, FaultAction::kDelay};
-  cursor.allowKeys({"operation", "object", "property", "occurrence", "action", "error", "seconds"});
-  Fault fault;
-  readSelectors(cursor, scenario, fault);
-
-  Names names;
-  for (const FaultAction action : kActions) names.push_back(faultActionName(action));
-  const std::string name = cursor.at("action").oneOf(names, "an action");
-  fault.action = *std::ranges::find(kActions, name, &faultActionName);
-
-  if (const auto error = cursor.find("error")) {
-    if (fault.action != FaultAction::kFail) error->fail("only the action \"fail\" has an error.");
-    fault.error = readError(*error);
+FaultTargets targetsOf(const Scenario& scenario) {
+  FaultTargets targets;
+  for (const Camera& camera : scenario.cameras) targets.streams.push_back(camera.id);
+  for (const CameraGroup& group : scenario.groups) targets.groups.push_back(group.id);
+  targets.deviceProperties = keysOf(CaptureObjectKind::kDevice);
+  targets.groupProperties = keysOf(CaptureObjectKind::kGroup);
+  targets.streamProperties = keysOf(CaptureObjectKind::kStream);
+  targets.hidDevices.emplace();
+  targets.featureReports.emplace();
+  for (const HidDeviceConfig& device : scenario.hidDevices) {
+    targets.hidDevices->push_back(device.name);
+    for (const HidFeatureReport& report : device.featureReports) {
+      targets.featureReports->emplace_back(hidReportName(report.id));
+    }
   }
-  if (fault.action == FaultAction::kDelay) {
-    fault.seconds = cursor.at("seconds").positiveNumber(kMaxDelay);
-  } else if (const auto seconds = cursor.find("seconds")) {
-    seconds->fail("only the action \"delay\" has seconds.");
-  }
-  return fault;
+  for (const auto& [name, value] : scenario.display.properties) targets.registryProperties.push_back(name);
+  return targets;
 }
 
 ExperimentRun readExperimentRun(const JsonCursor& cursor) {
@@ -283,9 +223,7 @@ Scenario scenarioOf(const JsonCursor& document) {
     }
   }
   if (const auto display = document.find("display")) scenario.display = readDisplay(*display);
-  if (const auto faults = document.find("faults")) {
-    for (const JsonCursor& fault : faults->elements()) scenario.faults.push_back(readFault(fault, scenario));
-  }
+  if (const auto faults = document.find("faults")) scenario.faults = readFaults(*faults, targetsOf(scenario));
   if (const auto expect = document.find("expect")) {
     for (const auto& [name, expectation] : expect->entries()) {
       scenario.expectations.set(name, readExpectation(expectation));

@@ -5,11 +5,6 @@
 
 namespace quazor {
 
-FaultError readError(const JsonCursor& cursor) {
-  cursor.allowKeys({"domain", "code", "message"});
-  return {cursor.at("domain").text(), cursor.at("code").integer(), cursor.at("message").text()};
-}
-
 std::uint64_t readNumberKey(const std::string& key, const std::string& what, std::uint64_t highest,
                             const JsonCursor& entry) {
   std::uint64_t number = 0;

@@ -1,7 +1,6 @@
 // What several parts of a scenario's document are made of.
 #pragma once
 
-#include "backends/simulated/scenario/fault.h"
 #include "base/json/json_cursor.h"
 
 #include <cstdint>
@@ -9,11 +8,8 @@
 
 namespace quazor {
 
-// Both throw JsonProblem, "PATH: ...".
-
-// A domain, a code and a message.
-FaultError readError(const JsonCursor& cursor);
 // The key of an entry that is a number from 0 to `highest`; `what` says of what: "a frame". `entry` is its value.
+// Throws JsonProblem, "PATH: ...".
 std::uint64_t readNumberKey(const std::string& key, const std::string& what, std::uint64_t highest,
                             const JsonCursor& entry);
 

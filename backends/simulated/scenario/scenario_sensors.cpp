@@ -1,10 +1,12 @@
 #include "backends/simulated/scenario/scenario_sensors.h"
 
+#include "backends/faults/fault_reader.h"
+#include "backends/faults/hid_report_name.h"
 #include "backends/simulated/scenario/scenario_parts.h"
-#include "backends/simulated/scenario/sensor_operations.h"
 
 #include <cstdint>
 #include <limits>
+#include <optional>
 #include <string_view>
 #include <utility>
 
@@ -22,9 +24,7 @@ constexpr std::uint64_t kHighest8 = std::numeric_limits<std::uint8_t>::max();
 std::uint8_t readByte(const JsonCursor& cursor) { return static_cast<std::uint8_t>(cursor.integer(0, kHighest8)); }
 
 std::uint8_t readReportID(const std::string& text, const JsonCursor& cursor) {
-  for (unsigned id = 0; id <= kHighest8; ++id) {
-    if (hidReportName(static_cast<std::uint8_t>(id)) == text) return static_cast<std::uint8_t>(id);
-  }
+  if (const std::optional<std::uint8_t> id = hidReportNamed(text)) return *id;
   cursor.fail(inQuotes(text) + " is not a report's ID; write it with two digits, like \"0x0A\".");
 }
 
@@ -63,7 +63,7 @@ HidReportShape readSingle(const JsonCursor& cursor) {
   readShape(cursor, shape);
   if (const auto error = cursor.find("error")) {
     if (shape.reportID || shape.length) error->fail("an error comes in place of a report, which then has no shape.");
-    shape.error = readError(*error);
+    shape.error = readFaultError(*error);
   }
   return shape;
 }

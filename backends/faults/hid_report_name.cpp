@@ -1,5 +1,6 @@
-#include "backends/simulated/scenario/sensor_operations.h"
+#include "backends/faults/hid_report_name.h"
 
+#include <array>
 #include <cstddef>
 
 namespace quazor {
@@ -19,5 +20,12 @@ constexpr std::array<Name, 256> kNames = makeNames();
 }  // namespace
 
 std::string_view hidReportName(std::uint8_t id) { return {kNames[id].data(), kNames[id].size()}; }
+
+std::optional<std::uint8_t> hidReportNamed(std::string_view text) {
+  for (std::size_t id = 0; id < kNames.size(); ++id) {
+    if (hidReportName(static_cast<std::uint8_t>(id)) == text) return static_cast<std::uint8_t>(id);
+  }
+  return std::nullopt;
+}
 
 }  // namespace quazor

@@ -1,4 +1,4 @@
-#include "backends/simulated/scenario/fault.h"
+#include "backends/faults/fault.h"
 
 #include <nlohmann/json.hpp>
 

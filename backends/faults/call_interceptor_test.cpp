@@ -1,6 +1,4 @@
-#include "backends/simulated/calls/call_interceptor.h"
-
-#include "backends/simulated/calls/capture_error.h"
+#include "backends/faults/call_interceptor.h"
 
 #include <gmock/gmock.h>
 #include <gtest/gtest.h>
@@ -62,7 +60,13 @@ class CallInterceptorTest : public ::testing::Test {
   }
 
   std::shared_ptr<SleepingClock> clock_ = std::make_shared<SleepingClock>();
-  CallInterceptor calls_{{}, clock_, [](std::string_view what) { throw Hung{std::string(what)}; }};
+  CallInterceptor calls_{{},
+                         clock_,
+                         [](std::string_view what) { throw Hung{std::string(what)}; },
+                         [](const CallSite& site, std::string sentence) {
+                           return errorWithMessage("LampErrorDomain", site.object.empty() ? 1 : 2, std::move(sentence),
+                                                   nullptr);
+                         }};
   int bodies_ = 0;
   bool bodySucceeds_ = true;
 };
@@ -79,11 +83,10 @@ TEST_F(CallInterceptorTest, WithoutFaultsTheCallIsMadeAndItsResultIsGiven) {
 
 TEST_F(CallInterceptorTest, AFailureWithoutAnErrorOfItsOwnGivesOneThatNamesTheCall) {
   calls_.addFault(fault("*", FaultAction::kFail));
-  constexpr const char* kError = "SimulatedCaptureErrorDomain code 1: ";
-  EXPECT_EQ(call("CapturePlugIn.device"), std::string(kError) + "CapturePlugIn.device failed.");
-  EXPECT_EQ(call(kStart, "wide"), std::string(kError) + "CaptureStream.start of wide failed.");
+  EXPECT_EQ(call("CapturePlugIn.device"), "LampErrorDomain code 1: CapturePlugIn.device failed.");
+  EXPECT_EQ(call(kStart, "wide"), "LampErrorDomain code 2: CaptureStream.start of wide failed.");
   EXPECT_EQ(call(kSet, "wide", "FormatIndex"),
-            std::string(kError) + "CaptureStream.setValue of wide for FormatIndex failed.");
+            "LampErrorDomain code 2: CaptureStream.setValue of wide for FormatIndex failed.");
   EXPECT_EQ(bodies_, 0);
 }
 
@@ -170,7 +173,7 @@ TEST_F(CallInterceptorTest, ACallThatAnEarlierFaultEndsStillCountsAsAnOccurrence
   calls_.addFault(first);
   calls_.addFault(second);
   EXPECT_EQ(call(kStart), "failed");
-  EXPECT_EQ(call(kStart), "SimulatedCaptureErrorDomain code 1: CaptureStream.start failed.");
+  EXPECT_EQ(call(kStart), "LampErrorDomain code 1: CaptureStream.start failed.");
   EXPECT_EQ(call(kStart), "done");
 }
 

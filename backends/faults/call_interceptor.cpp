@@ -1,10 +1,7 @@
-#include "backends/simulated/calls/call_interceptor.h"
+#include "backends/faults/call_interceptor.h"
 
-#include "backends/simulated/calls/capture_error.h"
-#include "backends/simulated/scenario/report_operations.h"
-#include "backends/simulated/scenario/sensor_operations.h"
-
-#include <algorithm>
+#include <chrono>
+#include <optional>
 
 namespace quazor {
 namespace {
@@ -22,24 +19,11 @@ std::string nameOf(const CallSite& site) {
   return name;
 }
 
-DiagnosticErrorPtr injectedError(const Fault& fault, const CallSite& site) {
-  if (fault.error) return errorWithMessage(fault.error->domain, fault.error->code, fault.error->message, nullptr);
-  if (std::ranges::find(kReportOperations, site.operation) != kReportOperations.end()) {
-    return makeError(SimulatedReportErrorDomain, static_cast<std::int64_t>(ReportErrorCode::kInjected), "%@ failed.",
-                     nameOf(site));
-  }
-  if (std::ranges::find(kSensorOperations, site.operation, &SensorOperation::name) != kSensorOperations.end()) {
-    return makeError(SimulatedHidErrorDomain, static_cast<std::int64_t>(HidErrorCode::kInjected), "%@ failed.",
-                     nameOf(site));
-  }
-  return makeError(SimulatedCaptureErrorDomain, static_cast<std::int64_t>(CaptureErrorCode::kInjected), "%@ failed.",
-                   nameOf(site));
-}
-
 }  // namespace
 
-CallInterceptor::CallInterceptor(std::vector<Fault> faults, std::shared_ptr<Clock> clock, Hang hang)
-    : clock_(std::move(clock)), hang_(std::move(hang)) {
+CallInterceptor::CallInterceptor(std::vector<Fault> faults, std::shared_ptr<Clock> clock, Hang hang,
+                                 InjectedError injectedError)
+    : clock_(std::move(clock)), hang_(std::move(hang)), injectedError_(std::move(injectedError)) {
   for (Fault& fault : faults) addFault(std::move(fault));
 }
 
@@ -88,16 +72,27 @@ std::vector<Fault> CallInterceptor::faultsOn(const CallSite& site) {
   return acting;
 }
 
+DiagnosticErrorPtr CallInterceptor::errorOf(const Fault& fault, const CallSite& site) const {
+  if (!fault.error) return injectedError_(site, nameOf(site) + " failed.");
+  return errorWithMessage(fault.error->domain, fault.error->code, fault.error->message, nullptr);
+}
+
 bool CallInterceptor::faultsLetPass(const CallSite& site, DiagnosticErrorPtr* error) {
   for (const Fault& fault : faultsOn(site)) {
     switch (fault.action) {
       case FaultAction::kDelay: clock_->sleep(nanosecondsFromSeconds(fault.seconds)); break;
       case FaultAction::kHang: hang_(nameOf(site) + " hangs"); return false;
       case FaultAction::kNothing: return false;
-      case FaultAction::kFail: storeError(error, injectedError(fault, site)); return false;
+      case FaultAction::kFail: storeError(error, errorOf(fault, site)); return false;
     }
   }
   return true;
+}
+
+CallInterceptor::Hang sleepForEver(std::shared_ptr<Clock> clock) {
+  return [clock = std::move(clock)](std::string_view) {
+    for (;;) clock->sleep(std::chrono::nanoseconds::max());
+  };
 }
 
 }  // namespace quazor

@@ -1,4 +1,4 @@
-// Fault: one thing that goes wrong on a simulated phone.
+// Fault: one thing that is made to go wrong on a platform.
 #pragma once
 
 #include <nlohmann/json_fwd.hpp>
@@ -13,8 +13,8 @@ namespace quazor {
 enum class FaultAction {
   kFail,     // the call fails with an error: the fault's, or one of the service
   kNothing,  // the call fails and has no error to give
-  kHang,     // the call never returns: SimulationStall in virtual time, a wait without end in real time
-  kDelay     // the call is made `seconds` late, by the phone's clock
+  kHang,     // the call never returns: an exception in virtual time, a wait without end in real time
+  kDelay     // the call is made `seconds` late, by the platform's clock
 };
 
 // An error that a fault makes a call fail with.
@@ -28,10 +28,10 @@ struct FaultError {
 
 // Which calls, and what happens to them. A selector that is not set takes every call.
 //
-// When several faults take one call, delays add up, and the first of the others in the order of the scenario decides.
+// When several faults take one call, delays add up, and the first of the others in their order decides.
 struct Fault {
   std::string operation;                    // such as "CaptureStream.start"; "*" is every operation that can fail
-  std::optional<std::string> object;        // the scenario's id of a camera, a group or a HID device
+  std::optional<std::string> object;        // the name of a camera, a group or a HID device
   std::optional<std::string> property;      // the key that the call reads or sets, or a feature report ("0xAB")
   std::optional<std::uint64_t> occurrence;  // the nth call, from 1, among those that the other selectors take
   FaultAction action = FaultAction::kFail;
@@ -47,10 +47,10 @@ struct FaultStatus {
   std::uint64_t fired = 0;
 };
 
-// The fault as it stands in a scenario file.
+// The fault as a file has it (fault_reader.h).
 nlohmann::ordered_json faultJson(const Fault& fault);
 
-// The word of a scenario file for an action.
+// The word of a file for an action.
 std::string_view faultActionName(FaultAction action);
 
 }  // namespace quazor

@@ -1,7 +1,7 @@
-// CallInterceptor: the one place that every call on the simulated phone passes.
+// CallInterceptor: the one place that every call on a platform with faults passes.
 #pragma once
 
-#include "backends/simulated/scenario/fault.h"
+#include "backends/faults/fault.h"
 #include "contract/diagnostic_error.h"
 #include "platform/clock.h"
 
@@ -20,7 +20,7 @@ namespace quazor {
 // A call as it has returned.
 struct PlatformCall {
   std::string operation;  // "CaptureStream.start"
-  std::string object;     // the scenario's id of the object, empty where a phone has only one
+  std::string object;     // the name of the object, empty where a platform has only one
   std::string detail;     // the property's key; of setValue "KEY = value"; of control calls the streams "(a, b)"; of
                           // Clock.sleep the seconds
   bool succeeded = false;
@@ -35,7 +35,7 @@ struct CallSite {
   std::string_view property;
 };
 
-// Lets the phone's faults act on calls, counts what they did, and tells an observer of every call.
+// Lets faults act on calls, counts what they did, and tells an observer of every call.
 //
 // Thread: any, also several at once. Calls are made, and the observer is told, outside the interceptor's lock.
 class CallInterceptor final {
@@ -43,9 +43,11 @@ class CallInterceptor final {
   using Observer = std::function<void(const PlatformCall&)>;
   // Waits for ever, or throws; `what` says what hangs.
   using Hang = std::function<void(std::string_view what)>;
+  // The error of a call that a fault without an error of its own makes fail; `sentence` says which call failed.
+  using InjectedError = std::function<DiagnosticErrorPtr(const CallSite& site, std::string sentence)>;
 
   // `clock` times the delays.
-  CallInterceptor(std::vector<Fault> faults, std::shared_ptr<Clock> clock, Hang hang);
+  CallInterceptor(std::vector<Fault> faults, std::shared_ptr<Clock> clock, Hang hang, InjectedError injectedError);
   CallInterceptor(const CallInterceptor&) = delete;
   CallInterceptor& operator=(const CallInterceptor&) = delete;
 
@@ -65,6 +67,12 @@ class CallInterceptor final {
     report(site, detail, static_cast<bool>(result));
     return result;
   }
+  // The same for a call without a detail.
+  template <class Body>
+  std::invoke_result_t<Body&> perform(const CallSite& site, DiagnosticErrorPtr* error, Body&& body) {
+    return perform(
+        site, error, [] { return std::string(); }, body);
+  }
 
   // Tells the observer of a call that has returned.
   template <class Detail>
@@ -82,13 +90,18 @@ class CallInterceptor final {
 
   bool faultsLetPass(const CallSite& site, DiagnosticErrorPtr* error);
   std::vector<Fault> faultsOn(const CallSite& site);
+  DiagnosticErrorPtr errorOf(const Fault& fault, const CallSite& site) const;
   std::shared_ptr<const Observer> currentObserver() const;
 
   const std::shared_ptr<Clock> clock_;
   const Hang hang_;
+  const InjectedError injectedError_;
   mutable std::mutex mutex_;  // guards what follows
   std::vector<CountedFault> faults_;
   std::shared_ptr<const Observer> observer_;  // null when there is none
 };
+
+// A hang that sleeps by the clock, for ever.
+CallInterceptor::Hang sleepForEver(std::shared_ptr<Clock> clock);
 
 }  // namespace quazor

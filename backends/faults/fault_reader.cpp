@@ -1,0 +1,140 @@
+#include "backends/faults/fault_reader.h"
+
+#include "backends/faults/hid_report_name.h"
+#include "backends/faults/operations.h"
+
+#include <algorithm>
+#include <array>
+#include <cstdint>
+#include <string_view>
+
+namespace quazor {
+namespace {
+
+using Names = std::vector<std::string_view>;
+
+constexpr std::uint64_t kMaxOccurrence = 1'000'000'000;
+constexpr double kMaxDelay = 1e9;
+constexpr std::string_view kEveryOperation = "*";
+
+// What one selector may name: with one operation, or with all together.
+struct Selectable {
+  Names names;
+  bool any = false;  // every name
+
+  void add(const std::vector<std::string>& more) {
+    for (const std::string& name : more) {
+      if (std::ranges::find(names, name) == names.end()) names.push_back(name);
+    }
+  }
+  void add(const std::optional<std::vector<std::string>>& more) {
+    if (more) add(*more);
+    any = any || !more;
+  }
+  bool isEmpty() const { return names.empty() && !any; }
+};
+
+Selectable objectsOf(const Names& operations, const FaultTargets& targets) {
+  Selectable objects;
+  for (const std::string_view name : operations) {
+    switch (findOperation(name)->object) {
+      case OperationObject::kStream: objects.add(targets.streams); break;
+      case OperationObject::kGroup: objects.add(targets.groups); break;
+      case OperationObject::kHidDevice: objects.add(targets.hidDevices); break;
+      case OperationObject::kOnlyOne: break;
+    }
+  }
+  return objects;
+}
+
+Selectable propertiesOf(const Names& operations, const FaultTargets& targets) {
+  Selectable properties;
+  for (const std::string_view name : operations) {
+    switch (findOperation(name)->property) {
+      case OperationProperty::kOfDevice: properties.add(targets.deviceProperties); break;
+      case OperationProperty::kOfGroup: properties.add(targets.groupProperties); break;
+      case OperationProperty::kOfStream: properties.add(targets.streamProperties); break;
+      case OperationProperty::kFeatureReport: properties.add(targets.featureReports); break;
+      case OperationProperty::kOfRegistry: properties.add(targets.registryProperties); break;
+      case OperationProperty::kNone: break;
+    }
+  }
+  return properties;
+}
+
+bool isKnown(const Selectable& selectable, const std::string& name) {
+  return std::ranges::find(selectable.names, name) != selectable.names.end();
+}
+
+std::string readObject(const JsonCursor& cursor, const std::string& operation, const Selectable& objects) {
+  if (objects.isEmpty()) {
+    cursor.fail(operation + " is not called on a camera, a group or a HID device; leave it out.");
+  }
+  return objects.any ? cursor.text() : cursor.oneOf(objects.names, "an object of " + operation);
+}
+
+std::string readProperty(const JsonCursor& cursor, const std::string& operation, const Selectable& properties) {
+  if (properties.isEmpty()) cursor.fail(operation + " is about no property; leave it out.");
+  if (!properties.any) return cursor.oneOf(properties.names, "a property of " + operation);
+  std::string name = cursor.text();
+  if (!isKnown(properties, name) && !hidReportNamed(name)) {
+    cursor.fail(inQuotes(name) + " is not a property of " + operation +
+                "; the ID of a feature report is written with two digits, like \"0x0A\".");
+  }
+  return name;
+}
+
+void readSelectors(const JsonCursor& cursor, const FaultTargets& targets, Fault& fault) {
+  Names all;
+  for (const Operation& operation : kOperations) all.push_back(operation.name);
+  Names known{kEveryOperation};
+  known.insert(known.end(), all.begin(), all.end());
+  fault.operation = cursor.at("operation").oneOf(known, "an operation that can fail");
+  const Names selected = fault.operation == kEveryOperation ? all : Names{fault.operation};
+
+  if (const auto object = cursor.find("object")) {
+    fault.object = readObject(*object, fault.operation, objectsOf(selected, targets));
+  }
+  if (const auto property = cursor.find("property")) {
+    fault.property = readProperty(*property, fault.operation, propertiesOf(selected, targets));
+  }
+  if (const auto occurrence = cursor.find("occurrence")) fault.occurrence = occurrence->integer(1, kMaxOccurrence);
+}
+
+Fault readFault(const JsonCursor& cursor, const FaultTargets& targets) {
+  constexpr std::array kActions{FaultAction::kFail, FaultAction::kNothing, FaultAction::kHang, FaultAction::kDelay};
+  cursor.allowKeys({"operation", "object", "property", "occurrence", "action", "error", "seconds"});
+  Fault fault;
+  readSelectors(cursor, targets, fault);
+
+  Names names;
+  for (const FaultAction action : kActions) names.push_back(faultActionName(action));
+  const std::string name = cursor.at("action").oneOf(names, "an action");
+  fault.action = *std::ranges::find(kActions, name, &faultActionName);
+
+  if (const auto error = cursor.find("error")) {
+    if (fault.action != FaultAction::kFail) error->fail("only the action \"fail\" has an error.");
+    fault.error = readFaultError(*error);
+  }
+  if (fault.action == FaultAction::kDelay) {
+    fault.seconds = cursor.at("seconds").positiveNumber(kMaxDelay);
+  } else if (const auto seconds = cursor.find("seconds")) {
+    seconds->fail("only the action \"delay\" has seconds.");
+  }
+  return fault;
+}
+
+}  // namespace
+
+std::vector<Fault> readFaults(const JsonCursor& cursor, const FaultTargets& targets) {
+  std::vector<Fault> faults;
+  for (const JsonCursor& fault : cursor.elements()) faults.push_back(readFault(fault, targets));
+  return faults;
+}
+
+FaultError readFaultError(const JsonCursor& cursor) {
+  cursor.allowKeys({"domain", "code", "message"});
+  return {cursor.at("domain").text(), cursor.at("code").integer(), cursor.at("message").text()};
+}
+
+}  // namespace quazor

@@ -1,0 +1,97 @@
+#include "backends/faults/fault_reader.h"
+
+#include <gmock/gmock.h>
+#include <gtest/gtest.h>
+
+#include <nlohmann/json.hpp>
+
+#include <optional>
+#include <string>
+#include <vector>
+
+namespace quazor {
+namespace {
+
+using ::testing::ElementsAre;
+
+FaultTargets smallTargets() {
+  FaultTargets targets;
+  targets.streams = {"wide", "tele"};
+  targets.groups = {"back"};
+  targets.hidDevices = {"near"};
+  targets.deviceProperties = {"MultiCamConfiguration"};
+  targets.groupProperties = {"ActiveStreams"};
+  targets.streamProperties = {"FormatIndex"};
+  targets.registryProperties = {"Power"};
+  targets.featureReports = {"0xAB"};
+  return targets;
+}
+
+// The first fault of `text`, as JSON again, or what is wrong.
+std::string read(const std::string& text, const FaultTargets& targets = smallTargets()) {
+  const nlohmann::ordered_json document = nlohmann::ordered_json::parse(text);
+  try {
+    return faultJson(readFaults(JsonCursor(document), targets).at(0)).dump();
+  } catch (const JsonProblem& problem) {
+    return problem.what();
+  }
+}
+
+TEST(FaultReader, WhatIsWrittenIsRead) {
+  for (const char* text :
+       {R"([{"operation":"*","action":"nothing"}])",
+        R"([{"operation":"*","object":"back","property":"0xAB","action":"hang"}])",
+        R"([{"operation":"CaptureDevice.setValue","property":"MultiCamConfiguration","action":"fail"}])",
+        R"([{"operation":"CaptureStream.setValue","object":"tele","property":"FormatIndex","occurrence":2,)"
+        R"("action":"fail","error":{"domain":"D","code":-7,"message":"Broken."}}])",
+        R"([{"operation":"SynchronizedStreamsGroup.streams","object":"back","action":"delay","seconds":0.5}])",
+        R"([{"operation":"HidDevice.setFeatureReportWithID","object":"near","property":"0xAB","action":"nothing"}])",
+        R"([{"operation":"RegistryService.registryProperty","property":"Power","action":"nothing"}])"}) {
+    EXPECT_EQ('[' + read(text) + ']', text);
+  }
+}
+
+TEST(FaultReader, TheOrderIsKept) {
+  const nlohmann::ordered_json document = nlohmann::ordered_json::parse(
+      R"([{"operation":"CaptureStream.stop","action":"fail"},{"operation":"CaptureStream.start","action":"fail"}])");
+  std::vector<std::string> operations;
+  for (const Fault& fault : readFaults(JsonCursor(document), smallTargets())) operations.push_back(fault.operation);
+  EXPECT_THAT(operations, ElementsAre("CaptureStream.stop", "CaptureStream.start"));
+}
+
+TEST(FaultReader, NamesThatThePlatformDoesNotHaveAreRefused) {
+  EXPECT_EQ(read(R"([{"operation":"CaptureStream.start","object":"back","action":"fail"}])"),
+            R"([0].object: "back" is not an object of CaptureStream.start; known are "wide", "tele".)");
+  EXPECT_EQ(read(R"([{"operation":"HidDevice.open","object":"far","action":"fail"}])"),
+            R"([0].object: "far" is not an object of HidDevice.open; known are "near".)");
+  EXPECT_EQ(read(R"([{"operation":"CaptureStream.setValue","property":"Power","action":"fail"}])"),
+            R"([0].property: "Power" is not a property of CaptureStream.setValue; known are "FormatIndex".)");
+}
+
+TEST(FaultReader, AListThatIsNotThereTakesAnyName) {
+  FaultTargets targets = smallTargets();
+  targets.hidDevices.reset();
+  targets.featureReports.reset();
+  const std::string open =
+      R"({"operation":"HidDevice.setFeatureReportWithID","object":"far","property":"0x0C","action":"fail"})";
+  EXPECT_EQ(read('[' + open + ']', targets), open);
+  const std::string every = R"({"operation":"*","object":"far","property":"Power","action":"fail"})";
+  EXPECT_EQ(read('[' + every + ']', targets), every);
+  EXPECT_EQ(
+      read(R"([{"operation":"HidDevice.setFeatureReportWithID","property":"0xc","action":"fail"}])", targets),
+      R"([0].property: "0xc" is not a property of HidDevice.setFeatureReportWithID; the ID of a feature report is )"
+      R"(written with two digits, like "0x0A".)");
+  EXPECT_EQ(read(R"([{"operation":"CaptureStream.start","object":"far","action":"fail"}])", targets),
+            R"([0].object: "far" is not an object of CaptureStream.start; known are "wide", "tele".)");
+}
+
+TEST(FaultReader, APlatformWithoutObjectsOfAKindTakesNoObject) {
+  FaultTargets targets = smallTargets();
+  targets.groups.clear();
+  EXPECT_EQ(read(R"([{"operation":"SynchronizedStreamsGroup.streams","object":"back","action":"fail"}])", targets),
+            "[0].object: SynchronizedStreamsGroup.streams is not called on a camera, a group or a HID device; leave it "
+            "out.");
+}
+
+}  // namespace
+}  // namespace quazor
