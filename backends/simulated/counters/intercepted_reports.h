@@ -1,7 +1,7 @@
 // A report facility whose calls pass the phone's interceptor.
 #pragma once
 
-#include "backends/simulated/calls/call_interceptor.h"
+#include "backends/faults/call_interceptor.h"
 #include "platform/report_facility.h"
 
 #include <memory>
