@@ -1,0 +1,15 @@
+// The capture service of an intercepted platform.
+#pragma once
+
+#include "backends/faults/intercepted_platform.h"
+
+#include <memory>
+
+namespace quazor {
+
+// As interceptedPlatform() says. Neither pointer is null.
+std::shared_ptr<CaptureService> interceptedCapture(std::shared_ptr<CaptureService> capture,
+                                                   std::shared_ptr<CallInterceptor> calls,
+                                                   std::shared_ptr<const ObjectNames> names);
+
+}  // namespace quazor
