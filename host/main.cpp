@@ -41,9 +41,9 @@ int main(int argc, char** argv) {
     const std::vector<std::string> arguments(argv + (argc > 0 ? 1 : 0), argv + argc);
     return static_cast<int>(quazor::runProgram(arguments, quazor::Installation::ofThisProgram(), console));
   } catch (const std::exception& exception) {
-    std::cerr << "quazor: an internal error: " << exception.what() << '\n';
+    std::cerr << "quazor: internal error: " << exception.what() << '\n';
   } catch (...) {
-    std::cerr << "quazor: an internal error\n";
+    std::cerr << "quazor: internal error\n";
   }
   return static_cast<int>(quazor::ExitCode::kInternal);
 }

@@ -150,7 +150,7 @@ class KilledHostTest(unittest.TestCase):
                               stderr=subprocess.STDOUT, encoding="utf-8", check=False)
         self.assertEqual(done.returncode, 0, done.stdout)
         self.assertIn(f"{len(killed.events)} event", done.stdout)
-        self.assertIn(" 0 problems\nThe run did not come to its end", done.stdout)
+        self.assertIn(" 0 problems\nThe record is incomplete: the run did not end", done.stdout)
 
 
 if __name__ == "__main__":

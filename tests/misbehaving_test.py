@@ -80,23 +80,23 @@ class Outcome:
 
 
 def hang(name, stage="run", **more):
-    return Case(name, DEADLINE, f"the stage {stage} of {name} took longer than its deadline of {LIMIT} s",
+    return Case(name, DEADLINE, f"the stage {stage} of {name} exceeded its deadline of {LIMIT} s",
                 stage=stage, hangs=True, **more)
 
 
 def crash(name, stage="run", number=11, **more):
     ending = {6: "signal 6 (SIGABRT)", 11: "signal 11 (SIGSEGV)"}[number]
-    return Case(name, CRASHED, f"the stage {stage} of {name} crashed: its process was ended by {ending}",
+    return Case(name, CRASHED, f"the stage {stage} of {name} crashed: its process was terminated by {ending}",
                 stage=stage, **more)
 
 
 def leave(name, stage="run", code=0, **more):
-    return Case(name, EXITED, f"the stage {stage} of {name} ended its own process, with exit code {code}", stage=stage,
+    return Case(name, EXITED, f"the stage {stage} of {name} ended its own process with exit code {code}", stage=stage,
                 **more)
 
 
 def lose_connection(name, **more):
-    return Case(name, CONNECTION_LOST, f"the stage run of {name} closed or overwrote its process' connection to quazor",
+    return Case(name, CONNECTION_LOST, f"the stage run of {name} closed or overwrote its process's connection to quazor",
                 **more)
 
 
@@ -174,22 +174,22 @@ OUTPUT = ("output: " + "".join(map(chr, range(10))), {"hex": (b"output: " + byte
 IGNORES_CHILDREN = 'trap "" CHLD; exec "$@"'
 
 CASES = (
-    on_load("crash", CRASHED, "crash_on_load.so' crashed: its process was ended by signal 11 (SIGSEGV)"),
-    on_load("sleepForEver", DEADLINE, f"sleepForEver_on_load.so' took longer than its deadline of {LIMIT} s",
+    on_load("crash", CRASHED, "crash_on_load.so' crashed: its process was terminated by signal 11 (SIGSEGV)"),
+    on_load("sleepForEver", DEADLINE, f"sleepForEver_on_load.so' exceeded its deadline of {LIMIT} s",
             hangs=True),
-    on_load("leave", EXITED, "leave_on_load.so' ended its own process, with exit code 0"),
+    on_load("leave", EXITED, "leave_on_load.so' ended its own process with exit code 0"),
     on_load("throwException", CRASHED,
-            "throwException_on_load.so' crashed: its process was ended by signal 6 (SIGABRT)"),
+            "throwException_on_load.so' crashed: its process was terminated by signal 6 (SIGABRT)"),
 
     crash("LoadedWithMisbehaviour", "load", plugins=(LATER_CRASH,)),
 
     described("CrashWhenDescribed", CRASHED, "describing CrashWhenDescribed crashed: "
-              "its process was ended by signal 11 (SIGSEGV)"),
+              "its process was terminated by signal 11 (SIGSEGV)"),
     described("CrashWhenRunIsDescribed", CRASHED, "the stage describe of CrashWhenRunIsDescribed crashed: "
-              "its process was ended by signal 11 (SIGSEGV)"),
-    described("HangWhenDescribed", DEADLINE, f"describing HangWhenDescribed took longer than its deadline of {LIMIT} s",
+              "its process was terminated by signal 11 (SIGSEGV)"),
+    described("HangWhenDescribed", DEADLINE, f"describing HangWhenDescribed exceeded its deadline of {LIMIT} s",
               plugin="hanging_in_description", hangs=True),
-    described("ExitWhenDescribed", EXITED, "describing ExitWhenDescribed ended its own process, with exit code 0"),
+    described("ExitWhenDescribed", EXITED, "describing ExitWhenDescribed ended its own process with exit code 0"),
     described("ThrowWhenDescribed", EXCEPTION, "describing ThrowWhenDescribedExperiment threw an exception: "
               "the lamp is out"),
 
@@ -203,7 +203,7 @@ CASES = (
     crash("TerminateOnAnotherThread", number=6),
     crash("ThrowInDestructor", "teardown", number=6),
     Case("ThrowException", EXCEPTION, "run of ThrowExceptionExperiment threw an exception: the lamp is out"),
-    Case("ThrowNumber", EXCEPTION, "analyzing of ThrowNumberAnalysis threw something that is not a standard exception",
+    Case("ThrowNumber", EXCEPTION, "analysis by ThrowNumberAnalysis threw something that is not a standard exception",
          stage="analyse"),
     leave("Exit"),
     leave("LeaveAtOnce"),

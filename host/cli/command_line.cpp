@@ -18,37 +18,37 @@ namespace quazor {
 namespace {
 
 constexpr const char* kExamples = R"(Examples:
-  quazor list                                     what there is
-  quazor describe 'CameraSync*'                   what the diagnostics do, and their parameters
-  quazor run --all                                all of them, on the healthy phone
+  quazor list                                     list the installed diagnostics and experiments
+  quazor describe 'CameraSync*'                   what these diagnostics do, and their parameters
+  quazor run --all                                run every diagnostic on the healthy simulated phone
   quazor run CameraSyncDiagnostic.Back --set duration=10
   quazor run --all --phone my_phone.json --format json --output report.json
-  quazor phone probe                              what this machine has for a binding, and a first one
-  quazor run --all --phone linux:board.json       on this machine's own cameras, sensors and counters
+  quazor phone probe                              find this machine's devices and print a starter binding
+  quazor run --all --phone linux:board.json       run on this machine's own cameras, sensors and counters
   quazor run --all --record run.jsonl --output junit:report.xml --output ocp:report.jsonl
-  quazor run --only failed                        what did not pass the last time
-  quazor experiment CameraSyncExperiment.Back     what it measures, without judging it
-  quazor verify run.jsonl                         does every verdict follow from what was measured?
+  quazor run --only failed                        rerun the diagnostics that did not pass last time
+  quazor experiment CameraSyncExperiment.Back     measure without judging
+  quazor verify run.jsonl                         check that the recorded verdicts follow from the data
   quazor analyze run.jsonl --set analysis.frameCount=60
   quazor explain QZCapturePlugInErrorDomain:206   what an error means, and what to do next
-  quazor selftest                                 do the diagnostics find what they are for?
+  quazor selftest                                 check that the diagnostics detect simulated faults
 )";
 
 constexpr const char* kExitCodes = R"(Exit codes:
-  0    all diagnostics passed, all experiments returned a result
-  1    a diagnostic failed its limits; verify, diff or selftest found something
+  0    all diagnostics passed, or all experiments returned a result
+  1    a result was outside its limits, or verify, diff or selftest found a problem
   2    a diagnostic or experiment ended in an error
-  64   the command line is wrong
+  64   the command line is invalid
   66   a plug-in, scenario, binding, profile or record cannot be read or loaded
   70   quazor itself failed
   73   a report or record cannot be written
   130  interrupted)";
 
-// What a plug-in's process may have by default: more than any diagnostic needs, less than a bench's machine has.
+// Default memory limit of a plug-in process: more than any diagnostic needs, less than a bench machine has.
 constexpr std::uint64_t kMebibyte = 1024 * 1024;
 constexpr std::uint64_t kDefaultMebibytes = 4096;
 
-// The texts of a command line as CLI11 collects them, before they are checked.
+// Arguments as CLI11 collects them, before validation.
 struct RawOptions {
   std::vector<std::string> names;
   std::vector<std::string> plugins;
@@ -75,7 +75,7 @@ struct RawOptions {
 
 void addRepeatable(CLI::App& command, const std::string& name, std::vector<std::string>& texts,
                    const std::string& description, const std::string& form) {
-  // One text each time: what follows it is a diagnostic's name.
+  // Each occurrence takes one value; the next argument is the name of a diagnostic.
   command.add_option(name, texts, description)->allow_extra_args(false)->type_name(form);
 }
 
@@ -83,7 +83,7 @@ void addNames(CLI::App& command, std::vector<std::string>& names, const std::str
   command.add_option("NAME", names, whose + " name, or a pattern (*, ?, [...]) for several")->type_name("");
 }
 
-// CLI11 takes a name that is all in brackets for a list of names; with a mark before it, it stays a pattern.
+// CLI11 reads an argument in brackets as a list. A leading mark keeps such an argument a pattern.
 constexpr char kMark = '\x01';
 
 std::vector<std::string> marked(std::vector<std::string> arguments) {
@@ -107,57 +107,61 @@ void removeMarks(RawOptions& raw) {
 }
 
 void addPlugins(CLI::App& command, RawOptions& raw) {
-  addRepeatable(command, "--plugin", raw.plugins, "Load this plug-in, not the installed one; may be repeated", "FILE");
+  addRepeatable(command, "--plugin", raw.plugins, "Load this plug-in instead of the installed one; repeatable", "FILE");
 }
 
 void addReportOptions(CLI::App& command, RawOptions& raw, const std::vector<std::string>& formats) {
   std::string list;
   for (const std::string& format : formats) list += (list.empty() ? "" : ", ") + format;
-  command.add_option("--format", raw.format, "The form of the report: " + list)
+  command.add_option("--format", raw.format, "Report format: " + list)
       ->type_name("FORMAT")
       ->check(CLI::IsMember(formats));
   const bool several = formats.size() > 2;
   addRepeatable(command, "--output", raw.outputs,
-                several ? "Write the report to this file; with a format before it, a further report; may be repeated"
+                several ? "Write the report to this file. FORMAT:FILE writes an additional report; repeatable"
                         : "Write the report to this file",
                 several ? "[FORMAT:]FILE" : "FILE");
 }
 
 void addProcessOptions(CLI::App& command, RawOptions& raw) {
-  command.add_flag("--in-process", raw.inProcess,
-                   "Load plug-ins into quazor itself, for a debugger: without deadlines, and a crash ends all");
+  command.add_flag(
+      "--in-process", raw.inProcess,
+      "Load plug-ins into the quazor process, for use with a debugger. Deadlines are off, and a crash in a "
+      "plug-in ends quazor");
   addRepeatable(
       command, "--deadline", raw.deadlines,
-      "End a stage (load, describe, setup, run, teardown, analyse), or any, that takes longer; may be repeated",
+      "Time limit for one stage (load, describe, setup, run, teardown, analyse), or for every stage; repeatable",
       "[STAGE=]SECONDS");
-  command.add_option("--memory", raw.memory, "The most memory of a plug-in's process; 4096 by default")
+  command.add_option("--memory", raw.memory, "Memory limit for each plug-in process; default 4096")
       ->type_name("MEBIBYTES|none");
 }
 
 void addParameterOptions(CLI::App& command, RawOptions& raw) {
-  command.add_option("--profile", raw.profile, "Take parameter values from this file; none: from no file")
+  command
+      .add_option("--profile", raw.profile, "Read parameter values from this file; 'none' skips the default profile")
       ->type_name("FILE");
   addRepeatable(command, "--parameters", raw.parameterFiles,
-                "Take further values from this file, of a profile's form; may be repeated", "FILE");
+                "Read more parameter values from this file, which has the format of a profile; repeatable", "FILE");
   addRepeatable(command, "--set", raw.settings,
-                "Set a parameter, wherever it is declared; may be repeated. The variable QUAZOR_SET may hold such "
-                "settings too, separated by spaces. --set wins over it, it over --parameters, that over the profile",
+                "Set a parameter of every selected diagnostic that declares it; repeatable. The environment variable "
+                "QUAZOR_SET holds settings in the same form, separated by spaces. Precedence, highest first: --set, "
+                "QUAZOR_SET, --parameters, --profile",
                 "[experiment.|analysis.]NAME=VALUE");
 }
 
 void addLogOptions(CLI::App& command, RawOptions& raw) {
   command
       .add_option("--log-level", raw.logLevel,
-                  "Show log lines up to this level (error, default, debug) on the standard error stream, and keep them "
-                  "in reports; without it, error is shown and default kept")
+                  "Print log lines up to this level (error, default, debug) to standard error and include them in "
+                  "reports. Without this option, errors are printed and reports include default")
       ->type_name("LEVEL")
       ->check(CLI::IsMember({"error", "default", "debug"}));
   command.add_flag("--system-log", raw.systemLog,
-                   "Send log lines to the system's journal too, or to syslog where there is none");
+                   "Also send log lines to the systemd journal, or to syslog if there is no journal");
 }
 
 void addRecord(CLI::App& command, RawOptions& raw) {
-  command.add_option("--record", raw.record, "Keep everything that happens in this file, while it happens")
+  command.add_option("--record", raw.record, "Record every event of the run in this file as it happens")
       ->type_name("FILE");
 }
 
@@ -165,12 +169,11 @@ void addRunOptions(CLI::App& command, RawOptions& raw, const std::string& what) 
   command.add_flag("--all", raw.all, "Run all " + what);
   command
       .add_option("--phone", raw.phone,
-                  "Run on the phone of this scenario, or on this machine by this binding: a file, or the name of an "
-                  "installed one")
+                  "Device under test: a scenario file for a simulated phone, or linux: and a binding file for this "
+                  "machine. The name of an installed scenario or binding works too")
       ->type_name("[linux:]FILE");
-  command.add_flag("--realtime", raw.realTime, "Let the phone's time pass as real time does");
-  command.add_option("--seed", raw.seed, "Choose the order of what happens at the same time; 0 by default")
-      ->type_name("N");
+  command.add_flag("--realtime", raw.realTime, "Run the simulated phone in real time");
+  command.add_option("--seed", raw.seed, "Seed for the order of simultaneous events; default 0")->type_name("N");
   addRecord(command, raw);
   addLogOptions(command, raw);
 }
@@ -183,7 +186,7 @@ std::uint64_t parseWhole(const char* option, const std::string& text, std::uint6
   std::uint64_t number = 0;
   const auto [end, error] = std::from_chars(text.data(), text.data() + text.size(), number);
   if (error != std::errc() || end != text.data() + text.size() || number < least || number > most) {
-    throw CommandError(ExitCode::kUsage, std::string(option) + " '" + text + "': it must be a whole number from " +
+    throw CommandError(ExitCode::kUsage, std::string(option) + " '" + text + "': expected an integer from " +
                                              std::to_string(least) + " to " + std::to_string(most));
   }
   return number;
@@ -193,7 +196,7 @@ std::optional<std::uint64_t> memoryOf(const std::string& text) {
   if (text == "none") return std::nullopt;
   if (!text.empty()) return parseWhole("--memory", text, 1, UINT64_MAX / kMebibyte) * kMebibyte;
 #if defined(__SANITIZE_ADDRESS__) || defined(__SANITIZE_THREAD__)
-  return std::nullopt;  // the sanitizers' shadow takes more than there is
+  return std::nullopt;  // sanitizers reserve a larger address space than any limit
 #else
   return kDefaultMebibytes * kMebibyte;
 #endif
@@ -206,13 +209,13 @@ std::optional<LogLevel> logLevelOf(const std::string& text) {
   return std::nullopt;
 }
 
-// CLI11 takes an option with an empty text as one that was given; none of ours has a use for it.
+// CLI11 accepts an empty option value; quazor does not.
 void refuseEmpty(const CLI::App& command, const char* option) {
   const CLI::Option* const given = command.get_option_no_throw(option);
   if (given == nullptr) return;
   const std::vector<std::string>& texts = given->results();
   if (std::find(texts.begin(), texts.end(), std::string()) == texts.end()) return;
-  throw CommandError(ExitCode::kUsage, std::string(option) + ": its value is empty");
+  throw CommandError(ExitCode::kUsage, std::string(option) + ": the value is empty");
 }
 
 Command commandOf(const std::string& name) {
@@ -220,14 +223,13 @@ Command commandOf(const std::string& name) {
   return static_cast<Command>(found - std::begin(kCommandNames));
 }
 
-// Only a run can be written in several formats at once.
+// Only commands that run or analyze write reports in several formats.
 ReportOptions reportOf(const RawOptions& raw, bool isOfRun) {
   ReportOptions report;
   report.format = *formatNamed(raw.format);
   for (const std::string& text : raw.outputs) {
     OutputRequest output = isOfRun ? parseOutput(text, report.format) : OutputRequest{report.format, text};
-    if (output.file.empty())
-      throw CommandError(ExitCode::kUsage, "--output '" + text + "': the file's name is missing");
+    if (output.file.empty()) throw CommandError(ExitCode::kUsage, "--output '" + text + "': the file name is missing");
     if (output.file != text) {
       report.outputs.push_back(std::move(output));
     } else if (report.output.empty()) {
@@ -235,37 +237,38 @@ ReportOptions reportOf(const RawOptions& raw, bool isOfRun) {
     } else {
       throw CommandError(ExitCode::kUsage,
                          "--output '" + report.output.string() + "' and --output '" + text +
-                             (isOfRun ? "': write the format before further files, as in --output junit:FILE"
-                                      : "': one file is all that is written"));
+                             (isOfRun ? "': name the format of each additional report, as in --output junit:FILE"
+                                      : "': this command writes only one file"));
     }
   }
   return report;
 }
 
-// This machine is what it is: nothing chooses its time or its order of events.
+// --seed and --realtime have no effect on a real machine, so they are rejected there.
 void checkPhone(const CLI::App& command, const std::filesystem::path& phone) {
   const std::optional<std::filesystem::path> binding = bindingNamed(phone);
   if (!binding) return;
-  if (binding->empty()) throw CommandError(ExitCode::kUsage, "--phone 'linux:': the binding's file or name is missing");
+  if (binding->empty())
+    throw CommandError(ExitCode::kUsage, "--phone 'linux:': the name or file of the binding is missing");
   for (const char* option : {"--seed", "--realtime"}) {
     if (command.get_option(option)->count() == 0) continue;
-    throw CommandError(ExitCode::kUsage, std::string(option) + " is for simulated phones; --phone '" + phone.string() +
-                                             "' is this machine, in real time, in the order in which things happen");
+    throw CommandError(ExitCode::kUsage, std::string(option) + " applies only to simulated phones; --phone '" +
+                                             phone.string() + "' is this machine, which always runs in real time");
   }
 }
 
-// Diagnostics or experiments: names, --all or --only failed.
+// Exactly one of names, --all and --only failed must be present.
 void checkNames(const Options& options, const std::string& what) {
   const int ways = (options.names.empty() ? 0 : 1) + (options.all ? 1 : 0) + (options.onlyFailed ? 1 : 0);
   if (ways == 0) {
     throw CommandError(ExitCode::kUsage,
-                       "name the " + what + " to run, or give --all; 'quazor list' shows what there is");
+                       "name the " + what + " to run, or use --all; 'quazor list' shows what is available");
   }
   if (ways > 1 && !options.onlyFailed)
-    throw CommandError(ExitCode::kUsage, "give either names of " + what + " or --all");
-  if (ways > 1) throw CommandError(ExitCode::kUsage, "give --only failed without names and without --all");
+    throw CommandError(ExitCode::kUsage, "use either names of " + what + " or --all, not both");
+  if (ways > 1) throw CommandError(ExitCode::kUsage, "--only failed cannot be combined with names or --all");
   if (!options.onlyFailed && !options.failedOf.empty()) {
-    throw CommandError(ExitCode::kUsage, "--of is for --only failed");
+    throw CommandError(ExitCode::kUsage, "--of requires --only failed");
   }
 }
 
@@ -308,7 +311,7 @@ Options optionsOf(const CLI::App& command, const RawOptions& raw) {
 
 std::vector<std::string> commandNames() { return {std::begin(kCommandNames), std::end(kCommandNames)}; }
 
-// A first word that is no command gets a better answer than CLI11's.
+// Reports an unknown command with a suggestion, which CLI11 does not do.
 void refuseUnknownCommand(const std::vector<std::string>& arguments) {
   if (arguments.empty() || arguments.front().starts_with('-')) return;
   const std::string& word = arguments.front();
@@ -317,15 +320,15 @@ void refuseUnknownCommand(const std::vector<std::string>& arguments) {
   std::string list;
   for (const std::string& command : commands) list += (list.empty() ? "" : ", ") + command;
   throw CommandError(ExitCode::kUsage,
-                     "there is no command '" + word + "'" + didYouMean(word, commands) + "; the commands are " + list);
+                     "unknown command '" + word + "'" + didYouMean(word, commands) + "; the commands are " + list);
 }
 
 void declareLookingCommands(CLI::App& app, RawOptions& raw) {
-  CLI::App& list = *app.add_subcommand("list", "List the diagnostics, and the experiments that none of them uses");
+  CLI::App& list = *app.add_subcommand("list", "List diagnostics, and experiments that no diagnostic uses");
   addPlugins(list, raw);
   addReportOptions(list, raw, {"text", "json"});
   addProcessOptions(list, raw);
-  CLI::App& describe = *app.add_subcommand("describe", "Describe diagnostics or experiments, and their parameters");
+  CLI::App& describe = *app.add_subcommand("describe", "Describe diagnostics or experiments and their parameters");
   addNames(describe, raw.names, "A diagnostic's or experiment's");
   describe.get_option("NAME")->required();
   addPlugins(describe, raw);
@@ -336,18 +339,20 @@ void declareLookingCommands(CLI::App& app, RawOptions& raw) {
 
 void declareRunningCommands(CLI::App& app, RawOptions& raw) {
   const std::vector<std::string> formats = {"text", "json", "csv", "ocp", "junit"};
-  CLI::App& run = *app.add_subcommand("run", "Run diagnostics: measure, and judge by limits");
+  CLI::App& run = *app.add_subcommand("run", "Run diagnostics: measure, then compare the results with their limits");
   addNames(run, raw.names, "A diagnostic's");
   run.add_option("--only", raw.only,
-                 "failed: run what did not pass in the last run, or in the record of --of, as it was run then")
+                 "failed: rerun the diagnostics that did not pass in the last run, or in the record given with --of, "
+                 "with the same settings")
       ->type_name("failed")
       ->check(CLI::IsMember({"failed"}));
-  run.add_option("--of", raw.of, "The record that --only means")->type_name("RECORD");
+  run.add_option("--of", raw.of, "The record that --only refers to")->type_name("RECORD");
   addRunOptions(run, raw, "diagnostics");
-  CLI::App& experiment = *app.add_subcommand("experiment", "Run experiments alone: measure, and judge nothing");
+  CLI::App& experiment = *app.add_subcommand("experiment", "Run experiments only: measure without judging");
   addNames(experiment, raw.names, "An experiment's");
   addRunOptions(experiment, raw, "experiments");
-  CLI::App& analyze = *app.add_subcommand("analyze", "Analyse a record's results again, and judge them anew");
+  CLI::App& analyze =
+      *app.add_subcommand("analyze", "Analyze the measurements in a record again and judge the new results");
   addRecords(analyze, raw, 1, "The record");
   addRecord(analyze, raw);
   addLogOptions(analyze, raw);
@@ -360,27 +365,33 @@ void declareRunningCommands(CLI::App& app, RawOptions& raw) {
 }
 
 void declareOtherCommands(CLI::App& app, RawOptions& raw) {
-  CLI::App& verify = *app.add_subcommand("verify", "Check that a record's verdicts follow from the rest of it");
+  CLI::App& verify = *app.add_subcommand("verify", "Check that the verdicts in a record follow from its data");
   addRecords(verify, raw, 1, "The record");
-  CLI::App& diff = *app.add_subcommand("diff", "Show what two records tell differently");
+  CLI::App& diff = *app.add_subcommand("diff", "Show the differences between two records");
   addRecords(diff, raw, 2, "The two records");
-  CLI::App& explain = *app.add_subcommand("explain", "Explain an error or a diagnostic, and what to do next");
-  explain.add_option("WHAT", raw.names, "A diagnostic's name, an error's CODE or DOMAIN:CODE; without any, all titles")
+  CLI::App& explain = *app.add_subcommand("explain", "Explain an error, a diagnostic or a result, and what to do next");
+  explain
+      .add_option("WHAT", raw.names,
+                  "Name of a diagnostic or result, or CODE or DOMAIN:CODE of an error; omit to list all titles")
       ->type_name("");
   addReportOptions(explain, raw, {"text", "json"});
-  CLI::App& doctor = *app.add_subcommand("doctor", "Check the installation: plug-ins, profiles, phones, records");
+  CLI::App& doctor =
+      *app.add_subcommand("doctor", "Check the installation: plug-ins, profile, phones, bindings, last record");
   addPlugins(doctor, raw);
   addProcessOptions(doctor, raw);
-  CLI::App& selftest = *app.add_subcommand("selftest", "Run the diagnostics on every installed phone with a fault");
+  CLI::App& selftest = *app.add_subcommand(
+      "selftest", "Run the diagnostics on the installed simulated phones and report which faults they detect");
   addNames(selftest, raw.names, "A phone's");
-  selftest.add_option("--seeds", raw.seeds, "How many orders of events to try; 3 by default")->type_name("N");
+  selftest.add_option("--seeds", raw.seeds, "Number of seeds (event orders) to try on each phone; default 3")
+      ->type_name("N");
   addPlugins(selftest, raw);
   addReportOptions(selftest, raw, {"text", "json"});
   addProcessOptions(selftest, raw);
-  CLI::App& phone = *app.add_subcommand("phone", "Tell what this machine has for a binding, and print a first one");
+  CLI::App& phone =
+      *app.add_subcommand("phone", "Find the devices of this machine and print a starter binding for them");
   phone.add_option("WHAT", raw.names, "probe")->type_name("")->required()->expected(1)->check(CLI::IsMember({"probe"}));
-  addRepeatable(phone, "--output", raw.outputs, "Write the binding to this file, and print only the rest", "FILE");
-  CLI::App& completion = *app.add_subcommand("completion", "Print the completion for a shell: bash or zsh");
+  addRepeatable(phone, "--output", raw.outputs, "Write the binding to this file instead of printing it", "FILE");
+  CLI::App& completion = *app.add_subcommand("completion", "Print the completion script for bash or zsh");
   completion.add_option("SHELL", raw.names, "bash or zsh")
       ->type_name("")
       ->required()
@@ -408,7 +419,7 @@ std::vector<OptionSummary> optionsOfCommand(const std::string& command) {
       app.get_subcommands([&command](CLI::App* one) { return one->get_name() == command; });
   if (found.empty()) return options;
   for (const CLI::Option* const option : std::as_const(*found.front()).get_options()) {
-    if (option->get_lnames().empty()) continue;  // an operand
+    if (option->get_lnames().empty()) continue;  // positional
     options.push_back({"--" + option->get_lnames().front(), option->get_items_expected_max() > 0});
   }
   return options;
@@ -426,7 +437,7 @@ std::optional<Options> parseCommandLine(const std::vector<std::string>& argument
   }
   try {
     refuseUnknownCommand(arguments);
-    // CLI11 takes them from the back.
+    // CLI11 expects the arguments in reverse order.
     std::vector<std::string> texts = marked(arguments);
     std::reverse(texts.begin(), texts.end());
     app.parse(std::move(texts));
@@ -437,7 +448,7 @@ std::optional<Options> parseCommandLine(const std::vector<std::string>& argument
     app.exit(answer, out, err);
     *code = ExitCode::kAllPassed;
   } catch (const CLI::ParseError& refusal) {
-    err << "quazor: " << printable(refusal.what()) << "\nquazor --help shows how to call it.\n";
+    err << "quazor: " << printable(refusal.what()) << "\nRun 'quazor --help' for usage.\n";
     *code = ExitCode::kUsage;
   } catch (const CommandError& refusal) {
     err << "quazor: " << printable(refusal.what()) << '\n';

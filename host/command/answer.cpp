@@ -7,7 +7,7 @@ namespace quazor {
 void writeOutput(const ReportOptions& report, Console& console, const std::string& answer) {
   if (report.output.empty()) {
     console.out << answer << std::flush;
-    if (!console.out) throw CommandError(ExitCode::kCannotWrite, "the standard output cannot be written");
+    if (!console.out) throw CommandError(ExitCode::kCannotWrite, "standard output cannot be written");
     return;
   }
   const std::string problem = writeOutputFile(report.output, answer);

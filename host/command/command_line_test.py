@@ -45,7 +45,7 @@ class RefusalTest(CommandLineTest):
         self.assertEqual(existing.read_text(), "precious")
 
     def test_an_unknown_command(self):
-        self.assert_refused(quazor("rnu", "--all"), 64, "there is no command 'rnu'; did you mean 'run'?")
+        self.assert_refused(quazor("rnu", "--all"), 64, "unknown command 'rnu'; did you mean 'run'?")
 
     def test_an_unknown_option(self):
         self.refuse(64, "--bogus", arguments=["--bogus"])
@@ -60,14 +60,14 @@ class RefusalTest(CommandLineTest):
         self.refuse(64, "name the diagnostics to run", names=[])
 
     def test_an_unknown_parameter(self):
-        self.refuse(64, "takes a parameter 'measurd'; did you mean 'measured'?", arguments=["--set", "measurd=1"])
+        self.refuse(64, "has a parameter 'measurd'; did you mean 'measured'?", arguments=["--set", "measurd=1"])
 
     def test_a_parameter_of_the_other_half(self):
-        self.refuse(64, "no analysis of the diagnostics takes a parameter 'measured'",
+        self.refuse(64, "no analysis of the selected diagnostics has a parameter 'measured'",
                     arguments=["--set", "analysis.measured=1"])
 
     def test_a_missing_required_parameter(self):
-        self.refuse(64, "Fake.One needs the parameter experiment.duration", duration=None)
+        self.refuse(64, "Fake.One requires the parameter experiment.duration", duration=None)
 
     def test_a_parameter_that_is_set_twice(self):
         self.refuse(64, "--set 'duration=1' and --set 'experiment.duration=2' set the same parameter twice",
@@ -99,7 +99,7 @@ class RefusalTest(CommandLineTest):
                 path = self.directory / name if content is None else self.write(name, content)
                 result = quazor("run", "Fake.One", "--plugin", WORKING, "--profile", "none", "--set", "duration=1",
                                 "--output", self.output, "--phone", path)
-                self.assert_refused(result, 66, "the phone cannot be made", name)
+                self.assert_refused(result, 66, "the simulated phone cannot be created", name)
 
     def test_profiles_that_cannot_be_used(self):
         def entry(text):
@@ -109,7 +109,7 @@ class RefusalTest(CommandLineTest):
             "missing": (None, "cannot be read: No such file or directory"),
             "malformed": ("{", "cannot be parsed"),
             "schema": ('{"schema": 9, "diagnostics": {}}', 'must say "schema": 1'),
-            "diagnostic": (entry('"Fake.Oen": {}'), "'Fake.Oen', which fits no diagnostic; did you mean 'Fake.One'?"),
+            "diagnostic": (entry('"Fake.Oen": {}'), "'Fake.Oen', which matches no diagnostic; did you mean 'Fake.One'?"),
             "parameter": (entry('"Fake.*": {"experiment": {"duratoin": 1}}'), "did you mean 'duration'?"),
             "text": (entry('"Fake.*": {"experiment": {"duration": "1"}}'), "a number must stand there"),
         }
@@ -190,13 +190,13 @@ class ListTest(CommandLineTest):
     def test_lists_experiments_that_no_diagnostic_uses(self):
         result = quazor("list", "--plugin", WORKING, "--plugin", EXPERIMENTS)
         self.assertEqual(result.returncode, 0, result.stderr)
-        heading = "\n\nExperiments that no diagnostic uses; 'quazor experiment NAME' runs one:\n"
+        heading = "\n\nExperiments that no diagnostic uses (run one with 'quazor experiment NAME'):\n"
         before, after = result.stdout.split(heading)
         self.assertIn("Fake.One", before)
         self.assertEqual([line.split()[0] for line in after.splitlines()],
                          ["Alone.Images", "Alone.Counts", "Alone.Nothing"])
         self.assertRegex(after, r"Alone\.Images +Gives images\.\n")
-        self.assertRegex(after, r"Alone\.Nothing +could not be described: the factory of Alone\.Nothing made nothing\n")
+        self.assertRegex(after, r"Alone\.Nothing +could not be described: the factory of Alone\.Nothing returned no object\n")
 
     def test_lists_experiments_as_json(self):
         document = json.loads(quazor("list", "--plugin", EXPERIMENTS, "--format", "json").stdout)
@@ -223,7 +223,7 @@ class DescribeTest(CommandLineTest):
     def test_a_diagnostic_that_cannot_be_described_is_an_error(self):
         result = quazor("describe", "Broken.*", "--plugin", WORKING, "--profile", "none")
         self.assertEqual(result.returncode, 2)
-        self.assertIn("the factory of NoExperiment made nothing", result.stdout)
+        self.assertIn("the factory of NoExperiment returned no object", result.stdout)
         self.assertIn("describing ThrowingFactory threw an exception: factory threw", result.stdout)
         self.assertIn("describing UndescribableExperiment threw an exception: description threw", result.stdout)
 
@@ -232,7 +232,7 @@ class DescribeTest(CommandLineTest):
         profile = self.write("mine.json", '{"schema": 1, "diagnostics": {}, "experiments": {"Alone.*": {"images": 5}}}')
         result = quazor("describe", "Alone.Images", "--plugin", EXPERIMENTS, "--profile", profile, "--set", "samples=2")
         self.assertEqual(result.returncode, 0, result.stderr)
-        self.assertIn("An experiment that no diagnostic uses.", result.stdout)
+        self.assertIn("An experiment. No diagnostic uses it.", result.stdout)
         self.assertRegex(result.stdout, r"images +5  profile mine\.json +How many images")
         self.assertRegex(result.stdout, r"samples +2  command line +How many samples")
         self.assertNotIn("Analysis", result.stdout)
@@ -360,14 +360,14 @@ class RunTest(CommandLineTest):
         with open("/dev/full", "w") as full:
             result = self.run_fake(stdout=full)
         self.assertEqual(result.returncode, 73)
-        self.assertIn("the standard output cannot be written", result.stderr)
+        self.assertIn("standard output cannot be written", result.stderr)
 
     def test_a_fault_that_never_fired_is_pointed_out(self):
         phone = self.write("fault.json", json.dumps({**SCENARIO, "faults": [UNFIRED_FAULT]}))
         result = quazor("run", "Fake.One", "--plugin", WORKING, "--profile", "none", "--set", "duration=1", "--phone",
                         phone)
         self.assertEqual(result.returncode, 0)
-        self.assertIn("Fake.One: a fault of the phone never fired", result.stderr)
+        self.assertIn("Fake.One: a fault of the simulated phone never fired", result.stderr)
         self.assertIn("CaptureStream.start", result.stderr)
 
     def test_log_lines_on_standard_error(self):

@@ -27,7 +27,7 @@ class Doctor {
     std::vector<std::filesystem::path> plugins = options_.plugins;
     if (plugins.empty()) plugins = installation_.allPlugins();
     if (plugins.empty()) {
-      tell(false, "plug-in", installation_.defaultPlugin().string(), "there is no plug-in in this directory");
+      tell(false, "plug-in", installation_.defaultPlugin().string(), "no plug-in found in this directory");
     }
     for (const std::filesystem::path& plugin : plugins) {
       check("plug-in", plugin.string(), [&] { return findingOfPlugin(plugin); });
@@ -85,7 +85,7 @@ class Doctor {
     const std::vector<std::string> names = installation_.scenarioNames();
     check("backend", "simulated", [&] {
       phonesOfScenario(installation_.defaultScenario(), false, 0)();
-      return "the healthy phone can be made; " + countText(names.size(), "phone") + " installed";
+      return "created the healthy phone; " + countText(names.size(), "phone") + " installed";
     });
     for (const std::string& name : names) {
       try {
@@ -97,13 +97,13 @@ class Doctor {
     checkBindings();
     check("backend", "real time (--realtime)", [&] {
       phonesOfScenario(installation_.defaultScenario(), true, 0)();
-      return std::string("the healthy phone can be made");
+      return std::string("created the healthy phone");
     });
   }
 
   void checkBindings() {
     const std::vector<std::string> names = installation_.bindingNames();
-    const std::string here = "this machine can be asked: quazor phone probe; ";
+    const std::string here = "'quazor phone probe' lists this machine's devices; ";
     tell(true, "backend", "linux (--phone linux:FILE)", here + countText(names.size(), "binding") + " installed");
     for (const std::string& name : names) {
       try {
@@ -117,9 +117,9 @@ class Doctor {
   void checkLastRun() {
     const std::filesystem::path file = previousRunFile();
     if (file.empty()) {
-      tell(true, "last run", "-", "not kept: neither XDG_STATE_HOME nor HOME is set");
+      tell(true, "last run", "-", "not recorded: neither XDG_STATE_HOME nor HOME is set");
     } else if (!std::filesystem::exists(file)) {
-      tell(true, "last run", file.string(), "there was none");
+      tell(true, "last run", file.string(), "no run recorded yet");
     } else {
       check("last run", file.string(),
             [&] { return countText(failedNames(runIn(file)).size(), "diagnostic") + " did not pass"; });

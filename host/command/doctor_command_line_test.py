@@ -48,8 +48,8 @@ class DoctorTest(DoctorCase):
         findings = {name.rsplit("/", 1)[-1]: finding for _, name, finding in found}
         self.assertEqual(findings["camera_sensor_diagnostics.so"], "4 diagnostics, 4 experiments")
         self.assertEqual(findings["sensor_images.so"], "0 diagnostics, 1 experiment")
-        self.assertRegex(findings["backend simulated"], r"^the healthy phone can be made; \d+ phones installed$")
-        self.assertEqual(findings["last_run.jsonl"], "there was none")
+        self.assertRegex(findings["backend simulated"], r"^created the healthy phone; \d+ phones installed$")
+        self.assertEqual(findings["last_run.jsonl"], "no run recorded yet")
 
     def test_plug_ins_are_looked_at_one_by_one(self):
         files = (PLUGINS / "fatal_plugin.so", STREAMING, self.phone, self.directory / "missing.so")
@@ -60,7 +60,7 @@ class DoctorTest(DoctorCase):
         self.assertEqual({name: fine for name, (fine, _) in plugins.items()},
                          {"fatal_plugin.so": False, "streaming_plugin.so": True, "phone.json": False,
                           "missing.so": False})
-        self.assertIn("crashed: its process was ended by signal", plugins["fatal_plugin.so"][1])
+        self.assertIn("crashed: its process was terminated by signal", plugins["fatal_plugin.so"][1])
         self.assertIn("is not a shared object", plugins["phone.json"][1])
         self.assertIn("missing.so", plugins["missing.so"][1])
 
@@ -73,7 +73,7 @@ class DoctorTest(DoctorCase):
                                        env={"XDG_STATE_HOME": str(self.state)}).returncode, 1)
         self.assertIn("1 diagnostic did not pass", [finding for _, _, finding in self.doctor()[1]])
         (self.state / "quazor/last_run.jsonl").write_text("no record\n")
-        self.assert_refused(self.doctor(), "last run", "line 1: it is no JSON")
+        self.assert_refused(self.doctor(), "last run", "line 1: not valid JSON")
 
 
 class BrokenInstallationTest(DoctorCase):

@@ -122,28 +122,28 @@ class ExperimentTest(CommandLineTest):
             result = quazor(*arguments, "--plugin", plugin, "--phone", self.phone, "--output", self.output)
             self.assert_refused(result, code, *texts)
 
-        refuse("'Fake.One' is a diagnostic; 'quazor run Fake.One' runs it, and 'quazor experiment FakeExperiment' runs "
-               "its experiment alone", plugin=WORKING, arguments=["experiment", "Fake.One"])
-        refuse("'Alone.Images' is an experiment", "'quazor experiment Alone.Images' runs it",
+        refuse("'Fake.One' is a diagnostic; run it with 'quazor run Fake.One', or only its experiment with "
+               "'quazor experiment FakeExperiment'", plugin=WORKING, arguments=["experiment", "Fake.One"])
+        refuse("'Alone.Images' is an experiment", "run it with 'quazor experiment Alone.Images'",
                arguments=["run", "Alone.Images"])
-        refuse("the loaded plug-ins have no diagnostic, only experiments; 'quazor experiment --all' runs them",
+        refuse("the loaded plug-ins have no diagnostics, only experiments; run them with 'quazor experiment --all'",
                arguments=["run", "--all"])
         refuse("there is no experiment 'Alone.Image'; did you mean 'Alone.Images'?",
                arguments=["experiment", "Alone.Image"])
-        refuse("Alone.Images needs the parameter images; give it with --set images=VALUE or in a profile",
+        refuse("Alone.Images requires the parameter images; set it with --set images=VALUE or in a profile",
                arguments=["experiment", "Alone.Images", "--profile", "none"])
-        refuse("none of the experiments takes a parameter 'image'; did you mean 'images'?",
+        refuse("none of the selected experiments has a parameter 'image'; did you mean 'images'?",
                arguments=["experiment", "Alone.Images", "--set", "image=1"])
         profile = self.write("mine.json", '{"schema": 1, "diagnostics": {}, "experiments": {"Alone": {"images": 5}}}')
-        refuse("has an entry 'Alone', which fits no experiment", code=66,
+        refuse("has an entry 'Alone', which matches no experiment", code=66,
                arguments=["experiment", "Alone.Images", "--profile", profile])
 
     def test_a_plugin_without_experiments(self):
         # A plug-in's diagnostics have experiments, so only one that registers analyses alone has none.
         self.assert_refused(quazor("experiment", "--all", "--plugin", PLUGINS / "analysis_plugin.so"), 64,
-                            "the loaded plug-ins have no experiment")
+                            "the loaded plug-ins have no experiments")
         self.assert_refused(quazor("run", "--all", "--plugin", PLUGINS / "analysis_plugin.so", "--phone", self.phone),
-                            64, "the loaded plug-ins have no diagnostic\n")
+                            64, "the loaded plug-ins have no diagnostics\n")
 
 
 if __name__ == "__main__":

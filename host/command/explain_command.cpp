@@ -55,7 +55,7 @@ bool canEndIn(const std::vector<std::string>& names, const Explanation& error) {
 
 // The errors that the diagnostic or experiment can end in.
 void printErrors(std::ostream& out, const Explanation& one, const std::vector<Explanation>& all) {
-  std::string_view heading = "\n  Errors that it can end in\n";
+  std::string_view heading = "\n  Possible errors\n";
   for (const Explanation& error : all) {
     if (!canEndIn(one.names, error)) continue;
     out << heading << wrapped(keyOf(error.domain, error.code), "    ", "") << wrapped(error.title, "      ", "      ");

@@ -81,7 +81,7 @@ TEST_F(Explain, TellsWhatADiagnosticShowsAndTheErrorsThatItCanEndIn) {
             "  What to do next\n"
             "    1. Swap it.\n"
             "\n"
-            "  Errors that it can end in\n"
+            "  Possible errors\n"
             "    LampErrorDomain:1\n"
             "      The lamp is dark\n");
 }

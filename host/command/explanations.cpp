@@ -29,7 +29,7 @@ std::string lineOf(const JsonCursor& cursor) {
   std::string text = cursor.text();
   const auto isControl = [](char unit) { return static_cast<unsigned char>(unit) < 0x20 || unit == 0x7F; };
   if (text.front() == ' ' || text.back() == ' ' || std::ranges::any_of(text, isControl)) {
-    cursor.fail("the text must be one line without blanks at its ends.");
+    cursor.fail("the text must be one line without leading or trailing spaces.");
   }
   return text;
 }
@@ -43,9 +43,10 @@ std::vector<std::string> linesOf(const JsonCursor& array) {
   std::vector<std::string> lines;
   for (const JsonCursor& element : array.elements()) {
     lines.push_back(lineOf(element));
-    if (std::find(lines.begin(), lines.end() - 1, lines.back()) != lines.end() - 1) element.fail("this stands twice.");
+    if (std::find(lines.begin(), lines.end() - 1, lines.back()) != lines.end() - 1)
+      element.fail("this entry is a duplicate.");
   }
-  if (lines.empty()) array.fail("at least one must stand there.");
+  if (lines.empty()) array.fail("at least one entry is required.");
   return lines;
 }
 
@@ -89,7 +90,7 @@ Explanation namedOf(const JsonCursor& object) {
   if (explanation.kind == "result") {
     explanation.from = linesOf(object.at("from"));
   } else if (const std::optional<JsonCursor> from = object.find("from")) {
-    from->fail("only a result has it.");
+    from->fail("only a result can have this key.");
   }
   explanation.failing = optionalLine(object, "failing");
   return explanation;
@@ -101,7 +102,8 @@ std::vector<Explanation> explanationsOf(const JsonCursor& document) {
   std::vector<Explanation> explanations;
   const std::optional<JsonCursor> names = document.find("names");
   if (names) {
-    if (document.find("domain") || document.find("errors")) document.fail("a file has either errors or names.");
+    if (document.find("domain") || document.find("errors"))
+      document.fail("a file contains either errors or names, not both.");
     for (const JsonCursor& entry : names->elements()) explanations.push_back(namedOf(entry));
   } else {
     const std::string domain = lineOf(document.at("domain"));
@@ -198,14 +200,15 @@ std::string nearestDomain(const std::vector<Explanation>& explanations, const st
     if (one.isError() && one.domain == key.domain) codes += (codes.empty() ? "" : ", ") + std::to_string(one.code);
   }
   if (!codes.empty()) {
-    throw CommandError(ExitCode::kUsage,
-                       formatMessage("no explanation of code %@ in '%@'; it has %@", key.code, key.domain, codes));
+    throw CommandError(ExitCode::kUsage, formatMessage("no explanation of code %@ in '%@'; the explained codes are %@",
+                                                       key.code, key.domain, codes));
   }
   const std::string nearest = nearestDomain(explanations, key.domain);
-  throw CommandError(ExitCode::kUsage,
-                     formatMessage("no explanation of the error domain '%@'; %@", key.domain,
-                                   nearest.empty() ? "where the report says 'caused by', ask for the error above it"
-                                                   : "did you mean '" + nearest + "'?"));
+  throw CommandError(
+      ExitCode::kUsage,
+      formatMessage("no explanation of the error domain '%@'; %@", key.domain,
+                    nearest.empty() ? "if the report shows it after 'caused by', look up the error on the line above"
+                                    : "did you mean '" + nearest + "'?"));
 }
 
 [[noreturn]] void refuseName(const std::vector<Explanation>& explanations, const std::string& asked) {
@@ -218,7 +221,7 @@ std::string nearestDomain(const std::vector<Explanation>& explanations, const st
   const std::string nearest = didYouMean(asked, known);
   throw CommandError(ExitCode::kUsage,
                      formatMessage("no explanation of '%@'%@", asked,
-                                   nearest.empty() ? "; 'quazor explain' lists what there is" : nearest));
+                                   nearest.empty() ? "; 'quazor explain' lists all explanations" : nearest));
 }
 
 }  // namespace
@@ -236,12 +239,12 @@ std::vector<Explanation> readExplanations(const std::filesystem::path& directory
     for (Explanation& one : reading(file.string(), [&] { return readJsonFile(file); })) {
       for (const std::string& key : keysOf(one)) {
         const auto [earlier, isNew] = seen.emplace(key, file.string());
-        if (!isNew) refuse(file.string(), "'" + key + "' is explained in '" + earlier->second + "' already.");
+        if (!isNew) refuse(file.string(), "'" + key + "' is already explained in '" + earlier->second + "'.");
       }
       all.push_back(std::move(one));
     }
   }
-  if (all.empty()) refuse(directory.string(), "there are none.");
+  if (all.empty()) refuse(directory.string(), "the directory contains none.");
   return all;
 }
 

@@ -111,8 +111,10 @@ TEST(ParseExplanations, RefusesWhatIsNotExactlyOfTheForm) {
       {"an unknown key", with(plain, "errors", "error"), "there is no key \"error\"; did you mean \"errors\"?"},
       {"neither errors nor names", R"({"schema": 1})", "the key \"domain\" is missing"},
       {"no errors", R"({"schema": 1, "domain": "D"})", "the key \"errors\" is missing"},
-      {"errors and names", R"({"schema": 1, "errors": [], "names": []})", "a file has either errors or names."},
-      {"a domain and names", R"({"schema": 1, "domain": "D", "names": []})", "a file has either errors or names."},
+      {"errors and names", R"({"schema": 1, "errors": [], "names": []})",
+       "a file contains either errors or names, not both."},
+      {"a domain and names", R"({"schema": 1, "domain": "D", "names": []})",
+       "a file contains either errors or names, not both."},
       {"errors that are no array", with(plain, "[{", "{\"x\": [{").replace(0, 0, "").append("}"), "errors: must be"},
       {"an unknown key of an error", with(plain, "title", "titel"), "errors[0]: there is no key \"titel\""},
       {"no code", with(plain, R"("code": 6, )", ""), "errors[0]: the key \"code\" is missing"},
@@ -121,24 +123,25 @@ TEST(ParseExplanations, RefusesWhatIsNotExactlyOfTheForm) {
       {"no meaning", with(plain, R"("meaning": "M", )", ""), "the key \"meaning\" is missing"},
       {"no causes", with(plain, R"("causes": ["C"], )", ""), "the key \"causes\" is missing"},
       {"no steps", with(plain, R"(, "next": ["N"])", ""), "the key \"next\" is missing"},
-      {"no cause", with(plain, R"(["C"])", "[]"), "errors[0].causes: at least one must stand there."},
-      {"no step", with(plain, R"(["N"])", "[]"), "errors[0].next: at least one must stand there."},
+      {"no cause", with(plain, R"(["C"])", "[]"), "errors[0].causes: at least one entry is required."},
+      {"no step", with(plain, R"(["N"])", "[]"), "errors[0].next: at least one entry is required."},
       {"an empty step", with(plain, R"(["N"])", R"([""])"), "errors[0].next[0]: must be a string that is not empty"},
-      {"a step twice", with(plain, R"(["N"])", R"(["N", "O", "N"])"), "errors[0].next[2]: this stands twice."},
+      {"a step twice", with(plain, R"(["N"])", R"(["N", "O", "N"])"), "errors[0].next[2]: this entry is a duplicate."},
       {"a blank before a text", with(plain, R"("T")", R"(" T")"), "errors[0].title: the text must be one line"},
       {"a blank after a text", with(plain, R"("T")", R"("T ")"), "errors[0].title: the text must be one line"},
       {"two lines", with(plain, R"("M")", R"("M\nN")"), "errors[0].meaning: the text must be one line"},
       {"a delete character", with(plain, R"("M")", "\"M\x7FN\""), "errors[0].meaning: the text must be one line"},
-      {"no symbol", with(full, R"(["kFive"])", "[]"), "errors[0].symbols: at least one must stand there."},
+      {"no symbol", with(full, R"(["kFive"])", "[]"), "errors[0].symbols: at least one entry is required."},
       {"an unknown key of a message", with(full, R"("text")", R"("txt")"), "errors[0].messages[0]: there is no key"},
-      {"a message from nobody", with(full, R"(["D"])", "[]"), "messages[0].from: at least one must stand there."},
+      {"a message from nobody", with(full, R"(["D"])", "[]"), "messages[0].from: at least one entry is required."},
       {"a message's empty meaning", with(full, "It was set so.", ""),
        "errors[0].messages[0].meaning: must be a string"},
       {"an unknown key of a name", with(result, "failing", "fails"), "names[0]: there is no key \"fails\""},
-      {"no name", with(result, R"(["R 1", "R 2"])", "[]"), "names[0].names: at least one must stand there."},
+      {"no name", with(result, R"(["R 1", "R 2"])", "[]"), "names[0].names: at least one entry is required."},
       {"an unknown kind", with(result, R"("result")", R"("results")"), "\"results\" is not a kind; did you mean"},
       {"a result of nothing", with(result, R"("from": ["D"], )", ""), "names[0]: the key \"from\" is missing"},
-      {"a diagnostic of something", with(result, R"("result")", R"("diagnostic")"), "names[0].from: only a result has"},
+      {"a diagnostic of something", with(result, R"("result")", R"("diagnostic")"),
+       "names[0].from: only a result can have"},
       {"an empty failing", with(result, R"("F")", R"("")"), "names[0].failing: must be a string that is not empty"},
   };
   for (const Row& row : rows) {
@@ -166,17 +169,17 @@ TEST(ReadExplanations, RefusesWhatItCannotUse) {
     const char* problem;
   };
   const Row rows[] = {
-      {"nothing", {}, "there are none."},
-      {"a file without explanations", {{"a.json", names("")}}, "there are none."},
+      {"nothing", {}, "the directory contains none."},
+      {"a file without explanations", {{"a.json", names("")}}, "the directory contains none."},
       {"a file that is no JSON", {{"a.json", "x"}}, "/a.json:1: this is not JSON"},
       {"a file of another form", {{"a.json", "{}"}}, "/a.json' cannot be used: the document: the key"},
       {"a directory of such a name", {{"a.json/b", ""}}, "/a.json: this is a directory"},
       {"one error twice in a file",
        {{"a.json", errors("D", std::string(kPlainError) + "," + kPlainError)}},
-       "'D:6' is explained in '"},
+       "'D:6' is already explained in '"},
       {"one name in two files",
        {{"a.json", names(kDiagnostic)}, {"b.json", names(kDiagnostic)}},
-       "/b.json' cannot be used: 'D' is explained in '"},
+       "/b.json' cannot be used: 'D' is already explained in '"},
   };
   for (const Row& row : rows) {
     const TestDirectory directory;
@@ -229,8 +232,8 @@ TEST(FindExplanations, TellsTheNearestDomainWhateverItsEnding) {
   EXPECT_EQ(refusalOf(ExitCode::kUsage, [&] { findExplanations(all, "LapmErrorDomain:6"); }),
             "no explanation of the error domain 'LapmErrorDomain'; did you mean 'LampErrorDomain'?");
   EXPECT_EQ(refusalOf(ExitCode::kUsage, [&] { findExplanations(all, "OvenErrorDomain:6"); }),
-            "no explanation of the error domain 'OvenErrorDomain'; where the report says 'caused by', ask for "
-            "the error above it");
+            "no explanation of the error domain 'OvenErrorDomain'; if the report shows it after 'caused by', look up "
+            "the error on the line above");
 }
 
 TEST(FindExplanations, RefusesWhatHasNoneAndTellsTheNearest) {
@@ -242,23 +245,25 @@ TEST(FindExplanations, RefusesWhatHasNoneAndTellsTheNearest) {
   };
   const Row rows[] = {
       {"a code that the domain does not have", "FirstDomain:7",
-       "no explanation of code 7 in 'FirstDomain'; it has -5, 6"},
+       "no explanation of code 7 in 'FirstDomain'; the explained codes are -5, 6"},
       {"a domain with a slip", "FristDomain:6",
        "no explanation of the error domain 'FristDomain'; did you mean 'FirstDomain'?"},
       {"a foreign domain", "Alien:6",
-       "no explanation of the error domain 'Alien'; where the report says 'caused by', ask for the error above it"},
+       "no explanation of the error domain 'Alien'; if the report shows it after 'caused by', look up the error on the "
+       "line above"},
       {"no domain", ":0",
-       "no explanation of the error domain ''; where the report says 'caused by', ask for the error above it"},
+       "no explanation of the error domain ''; if the report shows it after 'caused by', look up the error on the line "
+       "above"},
       {"a code that no domain has", "999", "no error domain has an explanation of code 999"},
       {"a code that is no integer", "FirstDomain:x", "no explanation of 'FirstDomain:x'; did you mean 'FirstDomain'?"},
-      {"a code with something behind it", "6x", "no explanation of '6x'; 'quazor explain' lists what there is"},
+      {"a code with something behind it", "6x", "no explanation of '6x'; 'quazor explain' lists all explanations"},
       {"a code too large", "99999999999999999999",
-       "no explanation of '99999999999999999999'; 'quazor explain' lists what there is"},
+       "no explanation of '99999999999999999999'; 'quazor explain' lists all explanations"},
       {"a name with a slip", "R 3", "no explanation of 'R 3'; did you mean 'R 1'?"},
       {"a symbol with a slip", "kFiwe", "no explanation of 'kFiwe'; did you mean 'kFive'?"},
       {"a domain alone with a slip", "SecondDomian", "no explanation of 'SecondDomian'; did you mean 'SecondDomain'?"},
-      {"a pattern that fits nothing", "X*", "no explanation of 'X*'; 'quazor explain' lists what there is"},
-      {"nothing", "", "no explanation of ''; 'quazor explain' lists what there is"},
+      {"a pattern that fits nothing", "X*", "no explanation of 'X*'; 'quazor explain' lists all explanations"},
+      {"nothing", "", "no explanation of ''; 'quazor explain' lists all explanations"},
   };
   for (const Row& row : rows) {
     EXPECT_EQ(refusalOf(ExitCode::kUsage, [&] { findExplanations(all, row.asked); }), row.problem) << row.name;

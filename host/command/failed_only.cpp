@@ -25,7 +25,7 @@ void refuseFailedPlugins(const RecordedRun& run) {
     throw CommandError(
         ExitCode::kCannotRead,
         "the plug-in " + one.name +
-            " could not be loaded in that run, so what it holds was not run; name what is to be run, or give "
+            " could not be loaded in that run, so none of its diagnostics ran; name the diagnostics to run, or use "
             "--all");
   }
 }
@@ -48,7 +48,7 @@ Profile recordedProfile(const std::filesystem::path& record, const RecordedRun& 
 Options optionsToRunAgain(Options options) {
   const std::filesystem::path record = options.failedOf.empty() ? previousRunFile() : options.failedOf;
   if (record.empty() || (options.failedOf.empty() && !std::filesystem::exists(record))) {
-    throw CommandError(ExitCode::kCannotRead, "there is no record of a last run; --of RECORD names one");
+    throw CommandError(ExitCode::kCannotRead, "no previous run is recorded; use --of RECORD to name a record");
   }
   const RecordedRun run = runIn(record);
   refuseFailedPlugins(run);
@@ -58,8 +58,8 @@ Options optionsToRunAgain(Options options) {
   if (options.phone.empty()) {
     options.phone = run.began.phone;
     if (bindingNamed(options.phone) && (options.realTime || options.seed != 0)) {
-      throw CommandError(ExitCode::kUsage, "--seed and --realtime are for simulated phones; that run's was '" +
-                                               run.began.phone + "'; --phone chooses another");
+      throw CommandError(ExitCode::kUsage, "--seed and --realtime apply only to simulated phones, but that run used '" +
+                                               run.began.phone + "'; choose another phone with --phone");
     }
   }
   // What the installed profile set then is in the record; it may have changed since, or have been left out.

@@ -10,13 +10,12 @@ ExitCode phoneCommand(const Options& options, Console& console) {
   const PhoneProbe probe = probeThisMachine();
   for (const std::string& line : probe.lines) console.out << printable(line) << '\n';
   if (options.report.output.empty()) {
-    console.out
-        << "\nA binding to start from: save it, say which camera is which, and give it with --phone linux:FILE.\n\n";
+    console.out << "\nStarter binding: save it, set which camera is which, and run with --phone linux:FILE.\n\n";
   }
   writeOutput(options.report, console, probe.binding);
   if (!options.report.output.empty()) {
-    console.out << "\nA binding to start from is in " << printable(options.report.output.string())
-                << ": say there which camera is which, and give it with --phone linux:FILE.\n";
+    console.out << "\nThe starter binding is in " << printable(options.report.output.string())
+                << ": set which camera is which, and run with --phone linux:FILE.\n";
   }
   console.out.flush();
   return ExitCode::kAllPassed;

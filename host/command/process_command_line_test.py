@@ -61,15 +61,15 @@ class ParametersTest(CommandLineTest):
             (self.write("empty.json", ""), "cannot be parsed"),
             (self.directory, "is a directory"),
             (self.profile("typo.json", measurd=1), "did you mean 'measured'?"),
-            (self.write("other.json", '{"schema": 1, "diagnostics": {"Fake.Oen": {}}}'), "fits no diagnostic"),
+            (self.write("other.json", '{"schema": 1, "diagnostics": {"Fake.Oen": {}}}'), "matches no diagnostic"),
         ]
         for path, problem in rows:
             with self.subTest(problem):
                 self.assert_refused(self.run_fake("--parameters", path), 66, f"the profile '{path}'", problem)
-        self.assert_refused(self.run_fake("--parameters", ""), 64, "--parameters: its value is empty")
+        self.assert_refused(self.run_fake("--parameters", ""), 64, "--parameters: the value is empty")
 
     def test_what_is_refused_of_the_environment(self):
-        rows = {"measured": "it must have the form", "measured=": "a number is missing",
+        rows = {"measured": "expected [experiment.|analysis.]NAME=VALUE", "measured=": "a number is missing",
                 "measured=nan": "not a finite number", "measurd=1": "did you mean 'measured'?",
                 "measured=1 measured=2": "set the same parameter twice", "measured=1e999": "outside the range"}
         for text, problem in rows.items():
@@ -87,7 +87,7 @@ class ProcessTest(CommandLineTest):
         result = quazor("run", "Unruly", "Fake.One", "--plugin", UNRULY, "--plugin", WORKING, "--phone", self.phone,
                         "--profile", "none", "--set", "way=1", "--set", "duration=1", "--record", record)
         self.assertEqual(result.returncode, 2)
-        self.assertIn("QuazorHostErrorDomain code 6: the stage run of Unruly crashed: its process was ended by signal "
+        self.assertIn("QuazorHostErrorDomain code 6: the stage run of Unruly crashed: its process was terminated by signal "
                       "6 (SIGABRT)", result.stdout)
         self.assertIn("2 diagnostics: 1 passed, 0 failed, 1 ended in an error", result.stdout)
         self.assert_verifies(record)
@@ -95,7 +95,7 @@ class ProcessTest(CommandLineTest):
     def test_an_exit_is_an_error(self):
         result = self.run_unruly(2)
         self.assertEqual(result.returncode, 2)
-        self.assertIn("code 7: the stage run of Unruly ended its own process, with exit code 3", result.stdout)
+        self.assertIn("code 7: the stage run of Unruly ended its own process with exit code 3", result.stdout)
 
     def test_a_deadline_ends_what_takes_longer(self):
         for arguments in (["--deadline", "0.2"], ["--deadline", "run=0.2"], ["--deadline", "60", "--deadline", "run=0.2"]):
@@ -104,7 +104,7 @@ class ProcessTest(CommandLineTest):
                 result = self.run_unruly(3, *arguments)
                 self.assertLess(time.monotonic() - begin, 20)
                 self.assertEqual(result.returncode, 2)
-                self.assertIn("code 8: the stage run of Unruly took longer than its deadline of 0.2 s", result.stdout)
+                self.assertIn("code 8: the stage run of Unruly exceeded its deadline of 0.2 s", result.stdout)
 
     def test_a_deadline_of_another_stage_is_not_its(self):
         result = self.run_fake("--realtime", "--deadline", "analyse=0.05", "--deadline", "setup=0.05", duration=0.3)
@@ -112,7 +112,7 @@ class ProcessTest(CommandLineTest):
 
     def test_deadlines_that_are_refused(self):
         for text, problem in {"": "a number is missing", "0": "above zero", "-1": "above zero", "soon": "not a number",
-                              "nan": "not a finite number", "runn=1": "there is no stage 'runn'",
+                              "nan": "not a finite number", "runn=1": "unknown stage 'runn'",
                               "run=": "a number is missing"}.items():
             with self.subTest(text):
                 self.assert_refused(self.run_fake("--deadline", text), 64, f"--deadline '{text}'", problem)
@@ -144,7 +144,7 @@ class ProcessTest(CommandLineTest):
         self.assertEqual(quazor("verify", record).returncode, 0)
 
     def test_a_plugin_that_cannot_be_loaded_is_told(self):
-        text = f"quazor: loading the plug-in '{FATAL}' crashed: its process was ended by signal 6 (SIGABRT)\n"
+        text = f"quazor: loading the plug-in '{FATAL}' crashed: its process was terminated by signal 6 (SIGABRT)\n"
         listed = quazor("list", "--plugin", FATAL, "--plugin", WORKING)
         self.assertEqual((listed.returncode, listed.stderr), (66, text))
         self.assertIn("Fake.One", listed.stdout)
@@ -269,7 +269,7 @@ class InterruptTest(CommandLineTest):
         process.send_signal(signal.SIGINT)
         out, err = process.communicate(timeout=30)
         self.assertEqual((process.returncode, out), (130, ""))
-        self.assertIn("interrupted while the plug-ins were loaded", err)
+        self.assertIn("interrupted while loading the plug-ins", err)
         self.assertFalse(self.record.exists())
 
     def test_ignored_interrupts_stay_ignored(self):

@@ -61,7 +61,7 @@ class MakingTest(RecordTest):
                         "none", "--set", "duration=1", "--phone", self.phone, "--record", self.record)
         self.assertEqual(result.returncode, 2)
         self.assertEqual(events_in(self.record)[0]["names"][:2], ["fatal_plugin.so", "Fake.One"])
-        self.assertIn("fatal_plugin.so' crashed: its process was ended by signal 6 (SIGABRT)", result.stdout)
+        self.assertIn("fatal_plugin.so' crashed: its process was terminated by signal 6 (SIGABRT)", result.stdout)
         self.assert_verifies(self.record)
 
     def test_a_record_that_cannot_be_made_is_refused_before_anything_runs(self):
@@ -71,7 +71,7 @@ class MakingTest(RecordTest):
             with self.subTest(path):
                 self.assert_refused(self.run_fake("--record", path), 73,
                                     f"the record '{path}' cannot be written: {why}")
-        self.assert_refused(self.run_fake("--record", ""), 64, "--record: its value is empty")
+        self.assert_refused(self.run_fake("--record", ""), 64, "--record: the value is empty")
 
     def test_a_record_that_turns_out_not_to_be_writable_is_an_error(self):
         result = self.run_fake("--record", "/dev/full")
@@ -86,7 +86,7 @@ class MakingTest(RecordTest):
                           ["--record", "new", "--output", f"../{self.directory.name}/new"]):
             with self.subTest(arguments):
                 result = self.run_fake(*arguments, cwd=self.directory)
-                self.assert_refused(result, 64, "is to be written twice")
+                self.assert_refused(result, 64, "would be written twice")
                 self.assertEqual(one.read_text(), "precious")
         self.assertEqual(self.run_fake("--record", "/dev/null", "--output", "/dev/null").returncode, 0)
 
@@ -140,21 +140,21 @@ class VerifyTest(RecordTest):
         rows = [
             (self.directory / "missing", "cannot be read: No such file or directory"),
             (self.directory, "cannot be read: it is a directory"),
-            (self.write("empty", ""), "holds no event"),
-            (self.write("text", "hello\n"), "line 1: it is no JSON"),
-            (self.phone, "holds no event"),
+            (self.write("empty", ""), "contains no events"),
+            (self.write("text", "hello\n"), "line 1: not valid JSON"),
+            (self.phone, "contains no events"),
             (self.write("document", "{}\n"), "line 1: \"record\" is missing"),
-            (WORKING, "line 1: it is no JSON"),
-            ("/dev/null", "holds no event"),
+            (WORKING, "line 1: not valid JSON"),
+            ("/dev/null", "contains no events"),
         ]
         for path, problem in rows:
             with self.subTest(problem):
                 self.assert_refused(quazor("verify", path), 66, f"the record '{path}'", problem)
-        self.assert_refused(quazor("verify", self.changed(missing_line)), 66, "line 4: it has the sequence number 4")
-        self.assert_refused(quazor("verify", self.changed(other_form)), 66, "it has form 2, and this program reads")
+        self.assert_refused(quazor("verify", self.changed(missing_line)), 66, "line 4: the sequence number is 4")
+        self.assert_refused(quazor("verify", self.changed(other_form)), 66, "the record has format 2, but this program reads")
         self.assert_refused(quazor("verify"), 64, "RECORD")
         self.assert_refused(quazor("verify", self.record, self.record), 64)
-        self.assert_refused(quazor("verify", ""), 64, "RECORD: its value is empty")
+        self.assert_refused(quazor("verify", ""), 64, "RECORD: the value is empty")
 
     def test_a_record_that_was_cut_off_anywhere_is_not_wrong(self):
         whole = self.record.read_bytes()
@@ -165,20 +165,20 @@ class VerifyTest(RecordTest):
                 cut.write_bytes(whole[:size])
                 result = quazor("verify", cut)
                 self.assertEqual(result.returncode, 0, result.stderr)
-                self.assertIn("The run did not come to its end", result.stdout)
+                self.assertIn("The record is incomplete: the run did not end", result.stdout)
 
     def test_values_in_many_levels_do_not_crash_it(self):
         deep = '{"array":[' * 100_000 + "]}" * 100_000
         line = '{"sequence":1,"event":"collected","key":"k","value":' + deep + "}\n"
         record = self.write("deep", self.record.read_text().splitlines(keepends=True)[0] + line)
-        self.assert_refused(quazor("verify", record), 66, "line 2: there are too many levels of values in a value")
+        self.assert_refused(quazor("verify", record), 66, "line 2: value nested too deeply")
 
     def test_a_standard_output_that_is_full(self):
         with open("/dev/full", "w") as full:
             for command in (["verify", self.record], ["diff", self.record, self.record]):
                 result = quazor(*command, stdout=full)
                 self.assertEqual(result.returncode, 73)
-                self.assertIn("the standard output cannot be written", result.stderr)
+                self.assertIn("standard output cannot be written", result.stderr)
 
 
 class AnalyzeTest(RecordTest):
@@ -220,7 +220,7 @@ class AnalyzeTest(RecordTest):
         self.recorded("--set", "duration=1", code=2, names=["Fake.One", "Broken.Nothing"], duration=None)
         result = quazor("analyze", self.record)
         self.assertEqual(result.returncode, 0, result.stderr)
-        self.assertIn("Broken.Nothing has no experiment's result in the record; it is left out", result.stderr)
+        self.assertIn("Broken.Nothing has no experiment result in the record and is skipped", result.stderr)
 
     def test_in_this_process(self):
         result = quazor("analyze", self.record, "--in-process")
@@ -231,9 +231,9 @@ class AnalyzeTest(RecordTest):
         self.assert_refused(quazor("analyze"), 64, "RECORD")
         self.assert_refused(quazor("analyze", self.record, "--set", "minimun=1"), 64, "did you mean 'minimum'?")
         self.assert_refused(quazor("analyze", self.record, "--set", "measured=1"), 64,
-                            "no analysis of the diagnostics takes a parameter 'measured'")
+                            "no analysis of the selected diagnostics has a parameter 'measured'")
         self.assert_refused(quazor("analyze", self.record, "--set", "experiment.duration=1"), 64,
-                            "--set 'experiment.duration=1': analyze runs no experiment")
+                            "--set 'experiment.duration=1': 'quazor analyze' does not run experiments")
         self.assert_refused(quazor("analyze", self.record, "--plugin", EXPERIMENTS), 64, "there is no diagnostic")
         self.assert_refused(quazor("analyze", self.record, "--realtime"), 64, "--realtime")
         self.assert_refused(quazor("analyze", self.record, "--plugin", self.directory / "no.so"), 66, "does not exist")
@@ -242,7 +242,7 @@ class AnalyzeTest(RecordTest):
         self.recorded(code=2, names=["Broken.Nothing"], duration=None)
         result = quazor("analyze", self.record)
         self.assertEqual(result.returncode, 66)
-        self.assertIn("holds no experiment's result that could be analysed", result.stderr)
+        self.assertIn("contains no experiment result to analyze", result.stderr)
 
 
 class DiffTest(RecordTest):
@@ -250,7 +250,7 @@ class DiffTest(RecordTest):
         first = self.recorded("--set", "measured=90", names=["Fake.*"])
         second = self.recorded("--set", "measured=90", names=["Fake.*"], record=self.directory / "second.jsonl")
         result = quazor("diff", first, second)
-        self.assertEqual((result.returncode, result.stdout), (0, "The records tell the same.\n"))
+        self.assertEqual((result.returncode, result.stdout), (0, "The records do not differ.\n"))
 
     def test_differences_are_told(self):
         first = self.recorded("--set", "measured=90", "--set", "minimum=90")
@@ -271,13 +271,13 @@ class DiffTest(RecordTest):
         second = self.directory / "second.jsonl"
         quazor("analyze", first, "--record", second)
         result = quazor("diff", first, second)
-        self.assertEqual((result.returncode, result.stdout), (0, "The records tell the same.\n"))
+        self.assertEqual((result.returncode, result.stdout), (0, "The records do not differ.\n"))
 
     def test_what_is_refused(self):
         record = self.recorded()
         self.assert_refused(quazor("diff", record), 64, "RECORD")
         self.assert_refused(quazor("diff", record, self.directory / "missing"), 66, "missing' cannot be read")
-        self.assert_refused(quazor("diff", self.phone, record), 66, "holds no event")
+        self.assert_refused(quazor("diff", self.phone, record), 66, "contains no events")
 
 
 class OnlyFailedTest(RecordTest):
@@ -366,7 +366,7 @@ class OnlyFailedTest(RecordTest):
         self.assertEqual([record["name"] for record in json.loads(result.stdout)["diagnostics"]], ["Broken.Nothing"])
 
     def test_what_is_refused(self):
-        self.assert_refused(self.only_failed(), 66, "there is no record of a last run; --of RECORD names one")
+        self.assert_refused(self.only_failed(), 66, "no previous run is recorded; use --of RECORD to name a record")
 
     def test_takes_the_plug_ins_of_that_run(self):
         failing = ["--set", "measured=1", "--set", "minimum=90"]
@@ -379,10 +379,10 @@ class OnlyFailedTest(RecordTest):
         self.run_fake("--plugin", PLUGINS / "fatal_plugin.so", env=self.state)
         self.assert_refused(self.only_failed(), 66, "the plug-in fatal_plugin.so could not be loaded in that run")
         self.assert_refused(self.only_failed("--of", self.directory / "missing"), 66, "missing' cannot be read")
-        self.assert_refused(self.only_failed("--of", self.phone), 66, "holds no event")
+        self.assert_refused(self.only_failed("--of", self.phone), 66, "contains no events")
         self.assert_refused(self.only_failed("--all"), 64, "without names and without --all")
         self.assert_refused(self.run_fake("--only", "failed"), 64, "without names and without --all")
-        self.assert_refused(self.run_fake("--of", self.phone), 64, "--of is for --only failed")
+        self.assert_refused(self.run_fake("--of", self.phone), 64, "--of requires --only failed")
         self.assert_refused(self.run_fake("--only", "faild", names=[]), 64, "--only: faild not in {failed}")
 
     def test_a_place_for_the_last_run_that_cannot_be_used_changes_nothing(self):
@@ -413,14 +413,14 @@ class OutputsTest(RecordTest):
         self.assertTrue(junit.read_text().startswith("<?xml"))
 
     def test_what_is_refused(self):
-        self.assert_refused(self.run_fake("--output", "json:"), 64, "--output 'json:': the file's name is missing")
+        self.assert_refused(self.run_fake("--output", "json:"), 64, "--output 'json:': the file name is missing")
         self.assert_refused(self.run_fake("--output", "a", "--output", "b"), 64, "--output 'a' and --output 'b'")
         self.assert_refused(quazor("list", "--plugin", WORKING, "--output", "a", "--output", "b"), 64,
-                            "one file is all that is written")
+                            "this command writes only one file")
 
     def test_a_format_that_is_none(self):
         result = self.run_fake("--output", "xml:report", cwd=self.directory)
-        self.assert_refused(result, 64, "there is no format 'xml' (a file of this name is './xml:report')")
+        self.assert_refused(result, 64, "unknown format 'xml' (for a file of this name, write './xml:report')")
         result = self.run_fake("--output", "jnuit:report", cwd=self.directory)
         self.assert_refused(result, 64, "'./jnuit:report'); did you mean 'junit'?")
         result = self.run_fake("--output", "./xml:report", cwd=self.directory)

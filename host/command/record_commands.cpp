@@ -26,7 +26,7 @@ ExitCode verifyCommand(const Options& options, Console& console) {
   answer << countText(stored.events.size(), "event") << ", " << countText(verdicts, "verdict") << ", "
          << countText(problems.size(), "problem") << '\n';
   if (!complete) {
-    answer << "The run did not come to its end"
+    answer << "The record is incomplete: the run did not end"
            << (stored.cutOff ? ", and the record's last line is cut off.\n" : ".\n");
   }
   writeOutput(options.report, console, answer.str());
@@ -39,7 +39,7 @@ ExitCode diffCommand(const Options& options, Console& console) {
   const std::vector<std::string> differences = differencesOf(before, after);
   std::ostringstream answer;
   for (const std::string& one : differences) answer << printable(one) << '\n';
-  if (differences.empty()) answer << "The records tell the same.\n";
+  if (differences.empty()) answer << "The records do not differ.\n";
   writeOutput(options.report, console, answer.str());
   return differences.empty() ? ExitCode::kAllPassed : ExitCode::kFailed;
 }

@@ -51,23 +51,24 @@ TEST_F(RecordCommandsTest, VerifyTellsWhatIsWrong) {
   std::vector<RunEvent> events = {runOf({"A\n"}), beginningOf("A\n"), DiagnosticEnded{Verdict::kPass, momentAt(3)},
                                   RunEnded{std::nullopt, momentAt(4)}};
   EXPECT_EQ(verify(record("a", events)), ExitCode::kFailed);
-  EXPECT_EQ(
-      out_.str(),
-      "WRONG  A\\x0a has the failure none of quazor's own, but QuazorHostErrorDomain 9 'the run was not completed' "
-      "follows from its results, limits and errors\n"
-      "WRONG  A\\x0a has the verdict pass, but error follows from its results, limits and errors\n"
-      "4 events, 1 verdict, 2 problems\n");
+  EXPECT_EQ(out_.str(),
+            "WRONG  A\\x0a: the recorded error of quazor is none, but the results, limits and errors give "
+            "QuazorHostErrorDomain 9 "
+            "'the run was not completed'\n"
+            "WRONG  A\\x0a: the recorded verdict is pass, but the results, limits and errors give error\n"
+            "4 events, 1 verdict, 2 problems\n");
 }
 
 TEST_F(RecordCommandsTest, VerifyTellsThatARunDidNotComeToItsEnd) {
   std::vector<RunEvent> events = wholeRun();
   events.pop_back();
   EXPECT_EQ(verify(record("a", events)), ExitCode::kAllPassed);
-  EXPECT_THAT(out_.str(), testing::EndsWith("0 problems\nThe run did not come to its end.\n"));
+  EXPECT_THAT(out_.str(), testing::EndsWith("0 problems\nThe record is incomplete: the run did not end.\n"));
   const std::string text = directory_.read("a");
   EXPECT_EQ(verify(directory_.write("b", text.substr(0, text.size() - 3))), ExitCode::kAllPassed);
-  EXPECT_THAT(out_.str(),
-              testing::EndsWith("The run did not come to its end, and the record's last line is cut off.\n"));
+  EXPECT_THAT(
+      out_.str(),
+      testing::EndsWith("The record is incomplete: the run did not end, and the record's last line is cut off.\n"));
   EXPECT_EQ(verify(record("c", {runOf({})})), ExitCode::kAllPassed);
   EXPECT_THAT(out_.str(), testing::StartsWith("1 event, 0 verdicts, 0 problems\n"));
 }
@@ -76,7 +77,7 @@ TEST_F(RecordCommandsTest, DiffTellsWhatIsDifferent) {
   std::vector<RunEvent> events = wholeRun();
   const std::filesystem::path whole = record("a", events);
   EXPECT_EQ(diff(whole, whole), ExitCode::kAllPassed);
-  EXPECT_EQ(out_.str(), "The records tell the same.\n");
+  EXPECT_EQ(out_.str(), "The records do not differ.\n");
   std::get<DiagnosticStarted>(events[1]).name = "Go\nod";
   EXPECT_EQ(diff(whole, record("b", events)), ExitCode::kFailed);
   EXPECT_EQ(out_.str(), "Good is only in the first\nGo\\x0aod is only in the second\n");
@@ -98,7 +99,7 @@ TEST_F(RecordCommandsTest, TellWhenTheStandardOutputCannotBeWritten) {
       ADD_FAILURE() << "it went well";
     } catch (const CommandError& refusal) {
       EXPECT_EQ(refusal.code(), ExitCode::kCannotWrite);
-      EXPECT_THAT(refusal.what(), HasSubstr("the standard output cannot be written"));
+      EXPECT_THAT(refusal.what(), HasSubstr("standard output cannot be written"));
     }
   }
 }

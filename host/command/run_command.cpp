@@ -105,7 +105,7 @@ void checkOutputs(const Options& options) {
       return;
     const std::filesystem::path target = std::filesystem::weakly_canonical(std::filesystem::absolute(file), error);
     if (std::find(regular.begin(), regular.end(), target) != regular.end()) {
-      throw CommandError(ExitCode::kUsage, "the file '" + file.string() + "' is to be written twice");
+      throw CommandError(ExitCode::kUsage, "the file '" + file.string() + "' would be written twice");
     }
     regular.push_back(target);
   };
@@ -214,7 +214,7 @@ ExitCode analyzeCommand(const Options& given, const Installation& installation, 
   if (options.profile.empty()) options.withoutProfile = true;  // the record has what the profile set then
   for (ParameterOverride& setting : options.settings) {
     if (setting.half == Part::kExperiment) {
-      throw CommandError(ExitCode::kUsage, "--set '" + setting.text + "': analyze runs no experiment");
+      throw CommandError(ExitCode::kUsage, "--set '" + setting.text + "': 'quazor analyze' does not run experiments");
     }
     setting.half = Part::kAnalysis;
   }
@@ -227,13 +227,12 @@ ExitCode analyzeCommand(const Options& given, const Installation& installation, 
       analysable.push_back(&record);
       options.names.push_back(record.name);
     } else {
-      console.err << "quazor: " << printable(record.name)
-                  << " has no experiment's result in the record; it is left out\n";
+      console.err << "quazor: " << printable(record.name) << " has no experiment result in the record and is skipped\n";
     }
   }
   if (analysable.empty()) {
-    throw CommandError(ExitCode::kCannotRead, "the record '" + given.records.front().string() +
-                                                  "' holds no experiment's result that could be analysed");
+    throw CommandError(ExitCode::kCannotRead,
+                       "the record '" + given.records.front().string() + "' contains no experiment result to analyze");
   }
   if (options.plugins.empty()) options.plugins.assign(run.began.plugins.begin(), run.began.plugins.end());
   const Selection selection = select(options, installation);

@@ -18,9 +18,9 @@ Wanted wantedBy(Command command) {
 std::vector<Diagnostic> allWanted(const std::vector<Diagnostic>& catalogue, Wanted wanted, bool mayBeNone) {
   std::vector<Diagnostic> all = allOf(catalogue, wanted);
   if (!all.empty() || mayBeNone) return all;
-  if (wanted == Wanted::kExperiments) throw CommandError(ExitCode::kUsage, "the loaded plug-ins have no experiment");
-  const std::string hint = catalogue.empty() ? "" : ", only experiments; 'quazor experiment --all' runs them";
-  throw CommandError(ExitCode::kUsage, "the loaded plug-ins have no diagnostic" + hint);
+  if (wanted == Wanted::kExperiments) throw CommandError(ExitCode::kUsage, "the loaded plug-ins have no experiments");
+  const std::string hint = catalogue.empty() ? "" : ", only experiments; run them with 'quazor experiment --all'";
+  throw CommandError(ExitCode::kUsage, "the loaded plug-ins have no diagnostics" + hint);
 }
 
 std::vector<Diagnostic> wantedOf(const std::vector<Diagnostic>& catalogue, const Options& options, bool mayBeNone) {
@@ -93,7 +93,7 @@ PluginScan surveyOf(const Options& options, const Installation& installation, co
   }
   WatchedSignals signals;
   survey = scanPlugins(isolation, signals, described);
-  if (survey.interrupted) throw CommandError(ExitCode::kInterrupted, "interrupted while the plug-ins were loaded");
+  if (survey.interrupted) throw CommandError(ExitCode::kInterrupted, "interrupted while loading the plug-ins");
   return survey;
 }
 

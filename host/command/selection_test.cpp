@@ -86,13 +86,13 @@ TEST_F(SelectionTest, FindsAllOfWhatTheCommandIsFor) {
 TEST_F(SelectionTest, RefusesAllWhereThereIsNone) {
   options_.all = true;
   options_.plugins = {plugin("analysis")};
-  EXPECT_EQ(refusal(ExitCode::kUsage), "the loaded plug-ins have no diagnostic");
+  EXPECT_EQ(refusal(ExitCode::kUsage), "the loaded plug-ins have no diagnostics");
   options_.command = Command::kExperiment;
-  EXPECT_EQ(refusal(ExitCode::kUsage), "the loaded plug-ins have no experiment");
+  EXPECT_EQ(refusal(ExitCode::kUsage), "the loaded plug-ins have no experiments");
   options_.command = Command::kRun;
   options_.plugins = {plugin("experiments")};
   EXPECT_EQ(refusal(ExitCode::kUsage),
-            "the loaded plug-ins have no diagnostic, only experiments; 'quazor experiment --all' runs them");
+            "the loaded plug-ins have no diagnostics, only experiments; run them with 'quazor experiment --all'");
 }
 
 TEST_F(SelectionTest, DescribesDiagnosticsAndExperiments) {
@@ -129,10 +129,10 @@ TEST_F(SelectionTest, RefusesWhatIsWrongWithParameters) {
   // Only the installed profile may speak of what is not loaded.
   const auto other = directory_.write("other.json", profileText(R"({"Other": {}})"));
   options_.profile = other;
-  EXPECT_THAT(refusal(ExitCode::kCannotRead), HasSubstr("has an entry 'Other', which fits no diagnostic"));
+  EXPECT_THAT(refusal(ExitCode::kCannotRead), HasSubstr("has an entry 'Other', which matches no diagnostic"));
   options_.profile.clear();
   options_.parameterFiles = {other};
-  EXPECT_THAT(refusal(ExitCode::kCannotRead), HasSubstr("has an entry 'Other', which fits no diagnostic"));
+  EXPECT_THAT(refusal(ExitCode::kCannotRead), HasSubstr("has an entry 'Other', which matches no diagnostic"));
   options_.parameterFiles = {directory_.path() / "nothing.json"};
   EXPECT_THAT(refusal(ExitCode::kCannotRead), HasSubstr("nothing.json"));
   options_.parameterFiles.clear();
@@ -184,7 +184,8 @@ TEST_F(SelectionTest, AsksWhatElseAnEntryFitsBeforeItRefusesAParameter) {
   const auto withEntry = [this](const char* text) { options_.parameterFiles = {directory_.write("p.json", text)}; };
   const std::string only = profileText(R"({"Fake.*": {"experiment": {"way": 1}}})");
   withEntry(only.c_str());
-  EXPECT_THAT(refusal(ExitCode::kCannotRead), HasSubstr("sets 'way', which no experiment of 'Fake.*' takes"));
+  EXPECT_THAT(refusal(ExitCode::kCannotRead),
+              HasSubstr("sets 'way', but no experiment of 'Fake.*' has that parameter"));
   const std::string wide = profileText(R"({"[FU]*[!x]": {"experiment": {"way": 1}}})");
   withEntry(wide.c_str());
   EXPECT_THAT(selected(), ElementsAre("Fake.One"));
@@ -224,7 +225,7 @@ TEST_F(SelectionTest, IsInterruptedWhileThePluginsAreLoaded) {
   sigaddset(&interrupt, SIGINT);
   ::sigprocmask(SIG_BLOCK, &interrupt, nullptr);
   ::kill(::getpid(), SIGINT);
-  EXPECT_EQ(refusal(ExitCode::kInterrupted), "interrupted while the plug-ins were loaded");
+  EXPECT_EQ(refusal(ExitCode::kInterrupted), "interrupted while loading the plug-ins");
   ::sigprocmask(SIG_UNBLOCK, &interrupt, nullptr);
 }
 

@@ -28,7 +28,7 @@ std::vector<std::string> wantedScenarios(const Options& options, const Installat
     }
     const bool found = wanted.size() > before || std::find(wanted.begin(), wanted.end(), name) != wanted.end();
     if (!found)
-      throw CommandError(ExitCode::kUsage, "there is no installed phone '" + name + "'" + didYouMean(name, all));
+      throw CommandError(ExitCode::kUsage, "no installed phone is called '" + name + "'" + didYouMean(name, all));
   }
   return wanted;
 }
@@ -86,7 +86,7 @@ class Selftest {
       if (diagnostic.name == expected.name && diagnostic.experimentOnly == expected.experimentOnly) return one;
     }
     throw CommandError(ExitCode::kCannotRead,
-                       "the plug-ins have no " + expected.name + ", which an installed phone is for");
+                       "an installed phone expects " + expected.name + ", but no loaded plug-in has it");
   }
 
   ResolvedParameters parametersOf(const DescribedDiagnostic& described, const ExpectedOutcome& expected) const {

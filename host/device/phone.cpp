@@ -53,7 +53,7 @@ class PhoneOfBinding final : public Phone {
 
 template <class Content>
 Content contentOf(std::optional<Content> content, const std::string& problem) {
-  if (!content) throw CommandError(ExitCode::kCannotRead, "the phone cannot be made: " + problem);
+  if (!content) throw CommandError(ExitCode::kCannotRead, "the simulated phone cannot be created: " + problem);
   return *std::move(content);
 }
 

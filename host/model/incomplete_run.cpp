@@ -37,9 +37,10 @@ Unfinished unfinishedOf(const RunStarted& run, const std::vector<DiagnosticRecor
   return unfinished;
 }
 
-DiagnosticErrorPtr interruptionOf(const std::string& interrupted) {
-  return hostError(HostErrorCode::kInterrupted, interrupted.empty() ? "the run was interrupted between two"
-                                                                    : "the run was interrupted while it was running");
+DiagnosticErrorPtr interruptionOf(const RunStarted& run, const std::string& interrupted) {
+  const std::string idle =
+      run.ofExperiments ? "interrupted while no experiment was running" : "interrupted while no diagnostic was running";
+  return hostError(HostErrorCode::kInterrupted, interrupted.empty() ? idle : interrupted + " was interrupted");
 }
 
 }  // namespace quazor

@@ -1,4 +1,4 @@
-// What a run was to run and has no record of.
+// The diagnostics of a run that have no record because the run ended early.
 #pragma once
 
 #include "host/model/run_event.h"
@@ -10,16 +10,18 @@
 namespace quazor {
 
 struct Unfinished {
-  // What was running when the run was interrupted, unless it has a record that says so; empty between two.
+  // The diagnostic that was running at the interruption, unless its record already says so. Empty text: none was
+  // running.
   std::optional<std::string> interrupted;
-  std::vector<std::string> neverRun;  // in the order in which it was to run
+  std::vector<std::string> neverRun;  // in the planned order
 };
 
-// `interrupted` is that of RunEnded.
+// `interrupted` as in RunEnded.
 Unfinished unfinishedOf(const RunStarted& run, const std::vector<DiagnosticRecord>& records,
                         const std::optional<std::string>& interrupted);
 
-// The error of what was interrupted and has no record.
-DiagnosticErrorPtr interruptionOf(const std::string& interrupted);
+// The error to report for an interruption that no record shows. `interrupted` is the diagnostic that was running, or
+// empty.
+DiagnosticErrorPtr interruptionOf(const RunStarted& run, const std::string& interrupted);
 
 }  // namespace quazor

@@ -61,11 +61,11 @@ TEST(Unfinished, CountsWhatIsRunSeveralTimes) {
 }
 
 TEST(Interruption, IsTheHostsError) {
-  const DiagnosticErrorPtr error = interruptionOf("A");
+  const DiagnosticErrorPtr error = interruptionOf(runOf({"A"}), "A");
   EXPECT_EQ(error->domain(), QuazorHostErrorDomain);
   EXPECT_EQ(error->code(), static_cast<std::int64_t>(HostErrorCode::kInterrupted));
-  EXPECT_EQ(error->localizedDescription(), "the run was interrupted while it was running");
-  EXPECT_EQ(interruptionOf("")->localizedDescription(), "the run was interrupted between two");
+  EXPECT_EQ(error->localizedDescription(), "A was interrupted");
+  EXPECT_EQ(interruptionOf(runOf({"A"}), "")->localizedDescription(), "interrupted while no diagnostic was running");
 }
 
 }  // namespace

@@ -14,7 +14,7 @@ std::string problemOfBound(std::string_view which, const QZBound& bound, const M
   const Measurement& value = bound.value();
   if (!std::isfinite(value.value())) return formatMessage("its %@ bound is %@", which, value.value());
   if (&value.unit() != &measured.unit()) {
-    return formatMessage("its %@ bound is in '%@' and its value in '%@'", which, value.unit().symbol(),
+    return formatMessage("its %@ bound is in '%@' but its value is in '%@'", which, value.unit().symbol(),
                          measured.unit().symbol());
   }
   return {};

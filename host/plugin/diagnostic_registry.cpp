@@ -61,10 +61,9 @@ std::string_view nounOf(Wanted wanted) {
                                   [&name](const Diagnostic& one) { return matchesName(name, one.name); });
   if (other != catalogue.end()) {
     const std::string rest =
-        other->experimentOnly
-            ? "an experiment, which has no limits to be judged by; 'quazor experiment " + other->name + "' runs it"
-            : "a diagnostic; 'quazor run " + other->name + "' runs it, and 'quazor experiment " +
-                  other->experimentName + "' runs its experiment alone";
+        other->experimentOnly ? "an experiment and has no limits; run it with 'quazor experiment " + other->name + "'"
+                              : "a diagnostic; run it with 'quazor run " + other->name +
+                                    "', or only its experiment with 'quazor experiment " + other->experimentName + "'";
     const std::string subject = isPattern(name) ? "no " + noun + " matches " + quoted + ", but " + other->name : quoted;
     throw CommandError(ExitCode::kUsage, subject + " is " + rest);
   }
@@ -99,7 +98,8 @@ DiagnosticDescription describeDiagnostic(const Diagnostic& diagnostic) {
   callPlugin("describing " + diagnostic.experimentName, &description.error, [&](DiagnosticErrorPtr* error) {
     const std::shared_ptr<QZExperiment> experiment = diagnostic.makeExperiment();
     if (experiment == nullptr) {
-      *error = hostError(HostErrorCode::kNothingMade, "the factory of " + diagnostic.experimentName + " made nothing");
+      *error =
+          hostError(HostErrorCode::kNothingMade, "the factory of " + diagnostic.experimentName + " returned no object");
       return false;
     }
     description.experiment = experiment->experimentDescription();
@@ -109,7 +109,8 @@ DiagnosticDescription describeDiagnostic(const Diagnostic& diagnostic) {
   callPlugin("describing " + diagnostic.analysisName, &description.error, [&](DiagnosticErrorPtr* error) {
     const std::shared_ptr<QZAnalysis> analysis = diagnostic.makeAnalysis();
     if (analysis == nullptr) {
-      *error = hostError(HostErrorCode::kNothingMade, "the factory of " + diagnostic.analysisName + " made nothing");
+      *error =
+          hostError(HostErrorCode::kNothingMade, "the factory of " + diagnostic.analysisName + " returned no object");
       return false;
     }
     description.analysis = analysis->analysisDescription();

@@ -110,14 +110,13 @@ TEST_F(CatalogueTest, TakesADiagnosticAndAnExperimentOfOneNameForTwo) {
 
 TEST_F(CatalogueTest, NamesTheCommandForWhatIsNotWantedHere) {
   EXPECT_EQ(refusalOf({"Image.Alone"}),
-            "'Image.Alone' is an experiment, which has no limits to be judged by; 'quazor experiment Image.Alone' runs "
-            "it");
+            "'Image.Alone' is an experiment and has no limits; run it with 'quazor experiment Image.Alone'");
   EXPECT_EQ(refusalOf({"Im*"}),
-            "no diagnostic matches 'Im*', but Image.Alone is an experiment, which has no limits to be judged by; "
-            "'quazor experiment Image.Alone' runs it");
+            "no diagnostic matches 'Im*', but Image.Alone is an experiment and has no limits; run it with "
+            "'quazor experiment Image.Alone'");
   EXPECT_EQ(refusalOf({"Sync.Back"}, Wanted::kExperiments),
-            "'Sync.Back' is a diagnostic; 'quazor run Sync.Back' runs it, and 'quazor experiment Experiment' runs its "
-            "experiment alone");
+            "'Sync.Back' is a diagnostic; run it with 'quazor run Sync.Back', or only its experiment with 'quazor "
+            "experiment Experiment'");
 }
 
 TEST_F(CatalogueTest, RefusesANameInTheWordsOfWhatIsWanted) {
@@ -194,8 +193,8 @@ TEST_F(CatalogueTest, TellsWhyADiagnosticCannotBeDescribed) {
   const QZExperimentFactory experiment = catalogue_[0].makeExperiment;
   const QZAnalysisFactory analysis = catalogue_[0].makeAnalysis;
   const Row rows[] = {
-      {"no experiment", [] { return nullptr; }, analysis, "the factory of Experiment made nothing"},
-      {"no analysis", experiment, [] { return nullptr; }, "the factory of Analysis made nothing"},
+      {"no experiment", [] { return nullptr; }, analysis, "the factory of Experiment returned no object"},
+      {"no analysis", experiment, [] { return nullptr; }, "the factory of Analysis returned no object"},
       {"an experiment's factory that throws", []() -> std::shared_ptr<QZExperiment> { throw std::runtime_error("no"); },
        analysis, "describing Experiment threw an exception: no"},
       {"an analysis' factory that throws", experiment, []() -> std::shared_ptr<QZAnalysis> { throw 42; },

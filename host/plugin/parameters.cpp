@@ -79,8 +79,8 @@ void checkEntry(const Profile& profile, const ProfileEntry& entry, const std::ve
     for (const auto& [name, ignored] : entry.values(half)) {
       if (contains(names, name)) continue;
       throw CommandError(ExitCode::kCannotRead, "the " + profile.kind + " '" + profile.file.string() + "' sets '" +
-                                                    name + "', which no " + std::string(nameOf(half)) + " of '" +
-                                                    entry.name + "' takes" + didYouMean(name, names));
+                                                    name + "', but no " + std::string(nameOf(half)) + " of '" +
+                                                    entry.name + "' has that parameter" + didYouMean(name, names));
     }
   }
 }
@@ -135,7 +135,7 @@ void checkEntries(const Profile& profile, const std::vector<ProfileEntry>& entri
         if (one.diagnostic.experimentOnly == ofExperiments) names.push_back(one.diagnostic.name);
       }
       throw CommandError(ExitCode::kCannotRead, "the profile '" + profile.file.string() + "' has an entry '" +
-                                                    entry.name + "', which fits no " + noun +
+                                                    entry.name + "', which matches no " + noun +
                                                     didYouMean(entry.name, names));
     }
   }
@@ -176,7 +176,7 @@ ParameterOverride parseOverride(const std::string& text, OverridePlace place) {
   const std::string what = quoted(place, text) + ": ";
   const std::size_t equals = text.find('=');
   if (equals == std::string::npos) {
-    throw CommandError(ExitCode::kUsage, what + "it must have the form [experiment.|analysis.]NAME=VALUE");
+    throw CommandError(ExitCode::kUsage, what + "expected [experiment.|analysis.]NAME=VALUE");
   }
   ParameterOverride setting{text, std::nullopt, text.substr(0, equals), 0, place};
   for (const Part half : kHalves) {
@@ -185,7 +185,7 @@ ParameterOverride parseOverride(const std::string& text, OverridePlace place) {
     setting.half = half;
     setting.name.erase(0, prefix.size());
   }
-  if (setting.name.empty()) throw CommandError(ExitCode::kUsage, what + "the parameter's name is missing");
+  if (setting.name.empty()) throw CommandError(ExitCode::kUsage, what + "the parameter name is missing");
   std::string problem;
   const std::optional<Value> value = parseNumber(std::string_view(text).substr(equals + 1), &problem);
   if (!value) throw CommandError(ExitCode::kUsage, what + problem);
@@ -230,9 +230,9 @@ void checkOverrides(const std::vector<ParameterOverride>& settings, const std::v
     const std::vector<std::string> names = declaredNames(selected, setting.half);
     if (!contains(names, setting.name)) {
       const std::string noun = nounOf(selected);
-      const std::string where =
-          setting.half ? "no " + std::string(nameOf(*setting.half)) + " of the " + noun : "none of the " + noun;
-      throw CommandError(ExitCode::kUsage, quoted(setting.place, setting.text) + ": " + where + " takes a parameter '" +
+      const std::string where = setting.half ? "no " + std::string(nameOf(*setting.half)) + " of the selected " + noun
+                                             : "none of the selected " + noun;
+      throw CommandError(ExitCode::kUsage, quoted(setting.place, setting.text) + ": " + where + " has a parameter '" +
                                                setting.name + "'" + didYouMean(setting.name, names) +
                                                noteOfUndescribed(selected));
     }
@@ -260,7 +260,7 @@ void requireParameters(const DescribedDiagnostic& diagnostic, const ResolvedPara
       const std::string name =
           diagnostic.diagnostic.experimentOnly ? one.name : formatMessage("%@.%@", nameOf(half), one.name);
       throw CommandError(ExitCode::kUsage,
-                         formatMessage("%@ needs the parameter %@; give it with --set %@=VALUE or in a profile",
+                         formatMessage("%@ requires the parameter %@; set it with --set %@=VALUE or in a profile",
                                        diagnostic.diagnostic.name, name, name));
     }
   }

@@ -100,10 +100,10 @@ TEST(ParseSetting, RefusesOtherForms) {
     const char* problem;
   };
   constexpr Row kRows[] = {
-      {"", "it must have the form"},
-      {"duration", "it must have the form"},
-      {"=3", "the parameter's name is missing"},
-      {"analysis.=3", "the parameter's name is missing"},
+      {"", "expected [experiment.|analysis.]NAME=VALUE"},
+      {"duration", "expected [experiment.|analysis.]NAME=VALUE"},
+      {"=3", "the parameter name is missing"},
+      {"analysis.=3", "the parameter name is missing"},
       {"duration=", "a number is missing"},
       {"duration=3s", "'3s' is not a number"},
       {"duration=3=4", "'3=4' is not a number"},
@@ -120,23 +120,23 @@ TEST(CheckSettings, RefusesWhatNoneOfTheDiagnosticsTakes) {
     return refusalOf(ExitCode::kUsage, [&] { checkOverrides(settings(texts), selected); });
   };
   EXPECT_EQ(check({"duratoin=3"}, {sync()}),
-            "--set 'duratoin=3': none of the diagnostics takes a parameter 'duratoin'; "
+            "--set 'duratoin=3': none of the selected diagnostics has a parameter 'duratoin'; "
             "did you mean 'duration'?");
   EXPECT_EQ(check({"analysis.duration=3"}, {sync()}),
-            "--set 'analysis.duration=3': no analysis of the diagnostics takes a parameter 'duration'");
+            "--set 'analysis.duration=3': no analysis of the selected diagnostics has a parameter 'duration'");
   EXPECT_EQ(check({"duration=3", "timeout=3"}, {sync(), fault()}), "accepted");
-  EXPECT_THAT(check({"duration=3"}, {fault()}), HasSubstr("takes a parameter 'duration'"));
+  EXPECT_THAT(check({"duration=3"}, {fault()}), HasSubstr("has a parameter 'duration'"));
 }
 
 TEST(CheckSettings, SpeaksOfWhatIsSelected) {
   const auto check = [](const std::string& text, const std::vector<DescribedDiagnostic>& selected) {
     return refusalOf(ExitCode::kUsage, [&] { checkOverrides(settings({text}), selected); });
   };
-  EXPECT_EQ(check("x=3", {imagesAlone()}), "--set 'x=3': none of the experiments takes a parameter 'x'");
+  EXPECT_EQ(check("x=3", {imagesAlone()}), "--set 'x=3': none of the selected experiments has a parameter 'x'");
   EXPECT_EQ(check("analysis.images=3", {imagesAlone()}),
-            "--set 'analysis.images=3': no analysis of the experiments takes a parameter 'images'");
+            "--set 'analysis.images=3': no analysis of the selected experiments has a parameter 'images'");
   EXPECT_EQ(check("x=3", {imagesAlone(), fault()}),
-            "--set 'x=3': none of the diagnostics and experiments takes a parameter 'x'");
+            "--set 'x=3': none of the selected diagnostics and experiments has a parameter 'x'");
   EXPECT_EQ(check("experiment.images=3", {imagesAlone()}), "accepted");
 }
 
@@ -148,12 +148,13 @@ TEST(CheckProfile, ChecksTheEntriesOfExperimentsAgainstExperiments) {
     return refusalOf(ExitCode::kCannotRead, [&] { checkProfile(profile, {sync(), imagesAlone()}); });
   };
   EXPECT_EQ(check(R"({"Im*": {"images": 5}})", true), "accepted");
-  EXPECT_EQ(check(R"({"Images": {"image": 5}})", false),
-            "the profile 'some.json' sets 'image', which no experiment of 'Images' takes; did you mean 'images'?");
+  EXPECT_EQ(
+      check(R"({"Images": {"image": 5}})", false),
+      "the profile 'some.json' sets 'image', but no experiment of 'Images' has that parameter; did you mean 'images'?");
   EXPECT_EQ(check(R"({"Image": {"images": 5}})", true),
-            "the profile 'some.json' has an entry 'Image', which fits no experiment; did you mean 'Images'?");
+            "the profile 'some.json' has an entry 'Image', which matches no experiment; did you mean 'Images'?");
   EXPECT_EQ(check(R"({"Sync.Back": {"duration": 5}})", true),
-            "the profile 'some.json' has an entry 'Sync.Back', which fits no experiment");
+            "the profile 'some.json' has an entry 'Sync.Back', which matches no experiment");
   EXPECT_EQ(check(R"({"Sync.Back": {"duration": 5}})", false), "accepted");
 }
 
@@ -178,10 +179,10 @@ TEST(CheckProfile, RefusesAParameterThatNoDiagnosticOfTheEntryTakes) {
       checkProfile(profileWith(diagnostics), {sync(), fault(), undescribed()});
     });
   };
-  EXPECT_EQ(
-      check(R"({"Sync.*": {"experiment": {"duraton": 3}}})"),
-      "the profile 'dir/some.json' sets 'duraton', which no experiment of 'Sync.*' takes; did you mean 'duration'?");
-  EXPECT_THAT(check(R"({"Sync.*": {"analysis": {"duration": 3}}})"), HasSubstr("no analysis of 'Sync.*' takes"));
+  EXPECT_EQ(check(R"({"Sync.*": {"experiment": {"duraton": 3}}})"),
+            "the profile 'dir/some.json' sets 'duraton', but no experiment of 'Sync.*' has that parameter; did you "
+            "mean 'duration'?");
+  EXPECT_THAT(check(R"({"Sync.*": {"analysis": {"duration": 3}}})"), HasSubstr("no analysis of 'Sync.*' has"));
   EXPECT_EQ(check(R"({"[SF]*": {"experiment": {"duration": 3, "timeout": 4}}})"), "accepted");
   EXPECT_EQ(check(R"({"B*": {"experiment": {"anything": 3}}})"), "accepted");
 }
@@ -237,7 +238,7 @@ TEST(CheckProfile, RefusesAnEntryThatFitsNoDiagnosticOnlyWhenAllMustExist) {
   Profile profile = profileWith(R"({"Sync.Bakc": {"experiment": {"duration": 3}}})");
   EXPECT_EQ(
       refusalOf(ExitCode::kCannotRead, [&] { checkProfile(profile, {sync()}); }),
-      "the profile 'dir/some.json' has an entry 'Sync.Bakc', which fits no diagnostic; did you mean 'Sync.Back'?");
+      "the profile 'dir/some.json' has an entry 'Sync.Bakc', which matches no diagnostic; did you mean 'Sync.Back'?");
   profile.mayNameOthers = true;
   EXPECT_EQ(refusalOf(ExitCode::kCannotRead, [&] { checkProfile(profile, {sync()}); }), "accepted");
 }
@@ -318,10 +319,11 @@ TEST_F(SettingsOfEnvironment, AreSeparatedByWhiteSpace) {
 TEST_F(SettingsOfEnvironment, AreCalledByTheirVariable) {
   set("duration");
   EXPECT_THAT(refusalOf(ExitCode::kUsage, [] { overridesOfEnvironment(); }),
-              HasSubstr("QUAZOR_SET 'duration': it must have the form"));
+              HasSubstr("QUAZOR_SET 'duration': expected [experiment."));
   set("duratoin=3");
-  EXPECT_EQ(refusalOf(ExitCode::kUsage, [] { checkOverrides(overridesOfEnvironment(), {sync()}); }),
-            "QUAZOR_SET 'duratoin=3': none of the diagnostics takes a parameter 'duratoin'; did you mean 'duration'?");
+  EXPECT_EQ(
+      refusalOf(ExitCode::kUsage, [] { checkOverrides(overridesOfEnvironment(), {sync()}); }),
+      "QUAZOR_SET 'duratoin=3': none of the selected diagnostics has a parameter 'duratoin'; did you mean 'duration'?");
   set("duration=3 duration=4");
   EXPECT_EQ(refusalOf(ExitCode::kUsage, [] { checkOverrides(overridesOfEnvironment(), {sync()}); }),
             "QUAZOR_SET 'duration=3' and QUAZOR_SET 'duration=4' set the same parameter twice");
@@ -367,10 +369,10 @@ TEST(RequireParameters, RefusesARequiredParameterWithoutAValue) {
                      [&] { requireParameters(diagnostic, resolveParameters(diagnostic, {}, settings(texts))); });
   };
   EXPECT_EQ(require(sync(), {}),
-            "Sync.Back needs the parameter experiment.duration; give it with "
+            "Sync.Back requires the parameter experiment.duration; set it with "
             "--set experiment.duration=VALUE or in a profile");
   EXPECT_EQ(require(imagesAlone(), {"timeout=1"}),
-            "Images needs the parameter images; give it with --set images=VALUE or in a profile");
+            "Images requires the parameter images; set it with --set images=VALUE or in a profile");
   EXPECT_THAT(require(fault(), {"experiment.frameCount=1", "timeout=1"}), HasSubstr("analysis.frameCount"));
   EXPECT_EQ(require(fault(), {"frameCount=1", "timeout=1"}), "accepted");
   EXPECT_EQ(require(relaxed(), {}), "accepted");

@@ -25,7 +25,7 @@ namespace {
   const std::optional<int> version = contractVersionIn(message);
   if (!version || *version == QUAZOR_CONTRACT_VERSION) refusePlugin(file, "cannot be loaded: " + message);
   refusePlugin(file, "was built against version " + std::to_string(*version) +
-                         " of the plug-in contract, and this program has version " +
+                         " of the plug-in contract, but this program has version " +
                          std::to_string(QUAZOR_CONTRACT_VERSION) + "; rebuild the plug-in against this version");
 }
 
@@ -37,7 +37,7 @@ void loadPlugin(const std::filesystem::path& file) {
   // The absolute path has a slash, so that the linker opens this file and searches nowhere else.
   if (dlopen(std::filesystem::absolute(file).c_str(), RTLD_NOW | RTLD_LOCAL) == nullptr) {
     const char* message = dlerror();
-    refuseUnlinkable(file, message == nullptr ? "the dynamic linker does not say why" : message);
+    refuseUnlinkable(file, message == nullptr ? "the dynamic linker gives no reason" : message);
   }
   if (lab.refusedNames().size() > refused) {
     refusePlugin(file, "registers the name '" + lab.refusedNames()[refused] + "', which is already taken");
@@ -63,7 +63,7 @@ void checkPart(const LoadedPlugin& plugin, const std::string& diagnostic, QZLab:
   if (lab.find(kind, name) != nullptr) return;
   const std::string part = kind == QZLab::Kind::kExperiment ? "experiment" : "analysis";
   refusePlugin(plugin.file, "registers the diagnostic '" + diagnostic + "' with the " + part + " '" + name +
-                                "', which nobody has registered" + didYouMean(name, namesOf(lab, kind)));
+                                "', which is not registered" + didYouMean(name, namesOf(lab, kind)));
 }
 
 void checkDiagnostics(const std::vector<LoadedPlugin>& plugins) {

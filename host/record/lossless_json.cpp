@@ -43,12 +43,11 @@ std::string hexadecimal(const Octets& octets) {
 template <class Octets>
 Octets octetsOf(const std::string& text) {
   Octets octets;
-  if (text.size() % 2 != 0) throw BadRecord("hexadecimal digits are not in pairs");
+  if (text.size() % 2 != 0) throw BadRecord("odd number of hexadecimal digits");
   for (std::size_t i = 0; i < text.size(); i += 2) {
     const std::size_t high = kDigits.find(text[i]);
     const std::size_t low = kDigits.find(text[i + 1]);
-    if (high == std::string_view::npos || low == std::string_view::npos)
-      throw BadRecord("a hexadecimal digit is wrong");
+    if (high == std::string_view::npos || low == std::string_view::npos) throw BadRecord("invalid hexadecimal digit");
     octets.push_back(static_cast<typename Octets::value_type>(high << 4 | low));
   }
   return octets;
@@ -91,26 +90,26 @@ T contentAs(const Json& json, const char* what) {
   try {
     return json.get<T>();
   } catch (const Json::exception&) {
-    throw BadRecord(std::string("there is no ") + what + " where one is due");
+    throw BadRecord(std::string("expected a ") + what);
   }
 }
 
 std::int64_t signedFrom(const Json& json) {
-  if (!json.is_number_integer()) throw BadRecord("there is no integer where one is due");
+  if (!json.is_number_integer()) throw BadRecord("expected an integer");
   if (json.is_number_unsigned() &&
       json.get<std::uint64_t>() > static_cast<std::uint64_t>(std::numeric_limits<std::int64_t>::max())) {
-    throw BadRecord("an integer is too large");
+    throw BadRecord("integer too large");
   }
   return json.get<std::int64_t>();
 }
 
 std::uint64_t unsignedFrom(const Json& json) {
-  if (!json.is_number_unsigned()) throw BadRecord("there is no unsigned integer where one is due");
+  if (!json.is_number_unsigned()) throw BadRecord("expected an unsigned integer");
   return json.get<std::uint64_t>();
 }
 
 const Json& arrayIn(const Json& json) {
-  if (!json.is_array()) throw BadRecord("there is no array where one is due");
+  if (!json.is_array()) throw BadRecord("expected an array");
   return json;
 }
 
@@ -126,7 +125,7 @@ Value arrayFrom(const Json& json, int levels) {
 Dictionary nestedDictionaryFrom(const Json& json, int levels) {
   Dictionary dictionary;
   for (const Json& entry : arrayIn(json)) {
-    if (arrayIn(entry).size() != 2) throw BadRecord("an entry is not a key and a value");
+    if (arrayIn(entry).size() != 2) throw BadRecord("expected an entry of a key and a value");
     dictionary.set(textFrom(entry[0]), nestedValueFrom(entry[1], levels));
   }
   return dictionary;
@@ -139,8 +138,8 @@ DiagnosticErrorPtr nestedErrorFrom(const Json& json, int levels) {
 }
 
 Value nestedValueFrom(const Json& json, int levels) {
-  if (levels == 0) throw BadRecord("there are too many levels of values in a value");
-  if (!json.is_object() || json.size() != 1) throw BadRecord("a value is not an object with one key");
+  if (levels == 0) throw BadRecord("value nested too deeply");
+  if (!json.is_object() || json.size() != 1) throw BadRecord("expected a value: an object with one key");
   const std::string& kind = json.begin().key();
   const Json& content = json.begin().value();
   if (kind == "boolean") return contentAs<bool>(content, "boolean");
@@ -154,7 +153,7 @@ Value nestedValueFrom(const Json& json, int levels) {
   if (kind == "date") return Date(Date::duration(signedFrom(content)));
   if (kind == "bytes") return octetsOf<Bytes>(contentAs<std::string>(content, "string"));
   if (kind == "error") return nestedErrorFrom(content, levels - 1);
-  if (kind != "object") throw BadRecord("there is no kind of value '" + kind + "'");
+  if (kind != "object") throw BadRecord("unknown kind of value '" + kind + "'");
   if (content.is_null()) return std::shared_ptr<Object>();
   return std::make_shared<DescribedObject>(textFrom(content));
 }
@@ -166,14 +165,14 @@ Json boundJson(const QZBound* bound) {
 
 std::shared_ptr<const QZBound> boundFrom(const Json& json) {
   if (json.is_null()) return nullptr;
-  if (arrayIn(json).size() != 2) throw BadRecord("a bound is not a measurement and a boolean");
+  if (arrayIn(json).size() != 2) throw BadRecord("expected a bound: a measurement and a boolean");
   return std::make_shared<const QZBound>(measurementFrom(json[0]), contentAs<bool>(json[1], "boolean"));
 }
 
 }  // namespace
 
 const Json& memberOf(const Json& json, const char* key) {
-  if (!json.is_object()) throw BadRecord("there is no object where one is due");
+  if (!json.is_object()) throw BadRecord("expected an object");
   const auto found = json.find(key);
   if (found == json.end()) throw BadRecord(std::string("\"") + key + "\" is missing");
   return *found;
@@ -194,7 +193,7 @@ double numberFrom(const Json& json) {
   if (json == "nan") return std::numeric_limits<double>::quiet_NaN();
   if (json == "inf") return std::numeric_limits<double>::infinity();
   if (json == "-inf") return -std::numeric_limits<double>::infinity();
-  if (!json.is_number()) throw BadRecord("there is no number where one is due");
+  if (!json.is_number()) throw BadRecord("expected a number");
   return json.get<double>();
 }
 
@@ -245,7 +244,7 @@ Json losslessMeasurement(const Measurement& measurement) {
 }
 
 Measurement measurementFrom(const Json& json) {
-  if (arrayIn(json).size() != 2) throw BadRecord("a measurement is not a number and a unit");
+  if (arrayIn(json).size() != 2) throw BadRecord("expected a measurement: a number and a unit");
   return {numberFrom(json[0]), QZUnit::unitWithSymbol(textFrom(json[1]))};
 }
 

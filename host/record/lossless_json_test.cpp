@@ -171,14 +171,14 @@ TEST(ValueFrom, RefusesWhatItDoesNotHold) {
     const char* problem;
   };
   constexpr Row kRows[] = {
-      {"5", "a value is not an object with one key"},
-      {"{}", "a value is not an object with one key"},
-      {R"({"signed":1,"double":1.0})", "a value is not an object with one key"},
-      {R"({"thing":1})", "there is no kind of value 'thing'"},
+      {"5", "expected a value: an object with one key"},
+      {"{}", "expected a value: an object with one key"},
+      {R"({"signed":1,"double":1.0})", "expected a value: an object with one key"},
+      {R"({"thing":1})", "unknown kind of value 'thing'"},
       {R"({"boolean":1})", "there is no boolean"},
       {R"({"signed":1.5})", "there is no integer"},
       {R"({"signed":"1"})", "there is no integer"},
-      {R"({"signed":9223372036854775808})", "an integer is too large"},
+      {R"({"signed":9223372036854775808})", "integer too large"},
       {R"({"unsigned":-1})", "there is no unsigned integer"},
       {R"({"double":"NaN"})", "there is no number"},
       {R"({"double":null})", "there is no number"},
@@ -186,16 +186,16 @@ TEST(ValueFrom, RefusesWhatItDoesNotHold) {
       {R"({"string":5})", "there is no string"},
       {R"({"string":{"hax":"00"}})", "\"hex\" is missing"},
       {R"({"string":{"hex":5}})", "there is no string"},
-      {R"({"string":{"hex":"0"}})", "hexadecimal digits are not in pairs"},
-      {R"({"string":{"hex":"0G"}})", "a hexadecimal digit is wrong"},
-      {R"({"string":{"hex":"A0"}})", "a hexadecimal digit is wrong"},
+      {R"({"string":{"hex":"0"}})", "odd number of hexadecimal digits"},
+      {R"({"string":{"hex":"0G"}})", "invalid hexadecimal digit"},
+      {R"({"string":{"hex":"A0"}})", "invalid hexadecimal digit"},
       {R"({"bytes":5})", "there is no string"},
-      {R"({"bytes":"abc"})", "hexadecimal digits are not in pairs"},
-      {R"({"array":{}})", "there is no array"},
-      {R"({"array":[5]})", "a value is not an object with one key"},
-      {R"({"dictionary":{}})", "there is no array"},
-      {R"({"dictionary":[5]})", "there is no array"},
-      {R"({"dictionary":[["k"]]})", "an entry is not a key and a value"},
+      {R"({"bytes":"abc"})", "odd number of hexadecimal digits"},
+      {R"({"array":{}})", "there is not an array"},
+      {R"({"array":[5]})", "expected a value: an object with one key"},
+      {R"({"dictionary":{}})", "there is not an array"},
+      {R"({"dictionary":[5]})", "there is not an array"},
+      {R"({"dictionary":[["k"]]})", "expected an entry of a key and a value"},
       {R"({"dictionary":[[5,{"signed":1}]]})", "there is no string"},
       {R"({"date":1.0})", "there is no integer"},
       {R"({"error":5})", "there is no object"},
@@ -219,15 +219,15 @@ TEST(ResultFrom, RefusesWhatIsNoResult) {
       {"[]", "there is no object"},
       {R"({"measurement":[1.0,"x"]})", "\"name\" is missing"},
       {R"({"name":"n"})", "\"measurement\" is missing"},
-      {R"({"name":"n","measurement":5})", "there is no array"},
-      {R"({"name":"n","measurement":[1.0]})", "a measurement is not a number and a unit"},
+      {R"({"name":"n","measurement":5})", "there is not an array"},
+      {R"({"name":"n","measurement":[1.0]})", "expected a measurement: a number and a unit"},
       {R"({"name":"n","measurement":["x",1.0]})", "there is no number"},
       {R"({"name":"n","measurement":[1.0,"x"],"limit":5})", "there is no object"},
       {R"({"name":"n","measurement":[1.0,"x"],"limit":{"name":"l","upper":null}})", "\"lower\" is missing"},
       {R"({"name":"n","measurement":[1.0,"x"],"limit":{"name":"l","lower":null}})", "\"upper\" is missing"},
-      {R"({"name":"n","measurement":[1.0,"x"],"limit":{"name":"l","lower":5,"upper":null}})", "there is no array"},
+      {R"({"name":"n","measurement":[1.0,"x"],"limit":{"name":"l","lower":5,"upper":null}})", "there is not an array"},
       {R"({"name":"n","measurement":[1.0,"x"],"limit":{"name":"l","lower":[[1.0,"x"]],"upper":null}})",
-       "a bound is not a measurement and a boolean"},
+       "expected a bound: a measurement and a boolean"},
       {R"({"name":"n","measurement":[1.0,"x"],"limit":{"name":"l","lower":null,"upper":[[1.0,"x"],1]}})",
        "there is no boolean"},
   };
@@ -247,7 +247,7 @@ TEST(ValueFrom, RefusesWhatIsTooDeepInsteadOfRunningOutOfStack) {
 TEST(MemberOf, TellsWhatIsMissing) {
   EXPECT_EQ(memberOf(Json{{"a", 5}}, "a"), 5);
   EXPECT_EQ(problemOf([] { memberOf(Json{{"a", 5}}, "b"); }), "\"b\" is missing");
-  EXPECT_EQ(problemOf([] { memberOf(Json::array(), "b"); }), "there is no object where one is due");
+  EXPECT_EQ(problemOf([] { memberOf(Json::array(), "b"); }), "expected an object");
 }
 
 }  // namespace

@@ -35,17 +35,18 @@ RunEvent eventInLine(const std::filesystem::path& file, std::uint64_t sequence, 
       const Json& format = memberOf(json, "record");
       if (format != kRecordFormat) {
         refuseLine(file, 1,
-                   "it has form " + format.dump() + ", and this program reads form " + std::to_string(kRecordFormat));
+                   "the record has format " + format.dump() + ", but this program reads format " +
+                       std::to_string(kRecordFormat));
       }
     }
     if (memberOf(json, "sequence") != sequence) {
       refuseLine(file, sequence + 1,
-                 "it has the sequence number " + memberOf(json, "sequence").dump() + " instead of " +
+                 "the sequence number is " + memberOf(json, "sequence").dump() + " instead of " +
                      std::to_string(sequence) + "; a line is missing or has been moved");
     }
     return eventFrom(json);
   } catch (const Json::exception&) {
-    refuseLine(file, sequence + 1, "it is no JSON");
+    refuseLine(file, sequence + 1, "not valid JSON");
   } catch (const BadRecord& problem) {
     refuseLine(file, sequence + 1, problem.what());
   }
@@ -127,9 +128,9 @@ StoredRecord readRecord(const std::filesystem::path& file) {
   if (stream.bad())
     throw CommandError(ExitCode::kCannotRead, "the record '" + file.string() + "' cannot be read to its end");
   if (stored.events.empty())
-    throw CommandError(ExitCode::kCannotRead, "the record '" + file.string() + "' holds no event");
+    throw CommandError(ExitCode::kCannotRead, "the record '" + file.string() + "' contains no events");
   if (!std::holds_alternative<RunStarted>(stored.events.front())) {
-    refuseLine(file, 1, "a record begins with the event runBegan");
+    refuseLine(file, 1, "the first event of a record must be runBegan");
   }
   return stored;
 }

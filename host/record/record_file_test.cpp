@@ -110,7 +110,7 @@ TEST_F(RecordFileTest, GivesTheWholeLinesOfARecordThatWasCutOffAnywhere) {
     directory_.write("cut", text);
     const auto lines = static_cast<std::size_t>(std::count(text.begin(), text.end(), '\n'));
     if (lines == 0) {
-      EXPECT_THAT(refusalOf(ExitCode::kCannotRead, [&] { readRecord(cut); }), HasSubstr("holds no event")) << size;
+      EXPECT_THAT(refusalOf(ExitCode::kCannotRead, [&] { readRecord(cut); }), HasSubstr("contains no events")) << size;
       continue;
     }
     const StoredRecord stored = readRecord(cut);
@@ -132,7 +132,7 @@ TEST_F(RecordFileTest, RefusesARecordThatWasChanged) {
     return changed([&](auto& copy) { copy[at].replace(copy[at].find(what), what.size(), by); });
   };
   EXPECT_THAT(refusalOfText(replaced(3, R"("sequence":3)", R"("sequence":4)")),
-              HasSubstr("line 4: it has the sequence number 4 instead of 3; a line is missing or has been moved"));
+              HasSubstr("line 4: the sequence number is 4 instead of 3; a line is missing or has been moved"));
   EXPECT_THAT(refusalOfText(replaced(3, R"("sequence":3)", R"("sequence":"3")")), HasSubstr("sequence number \"3\""));
   EXPECT_THAT(refusalOfText(replaced(3, R"("sequence":3)", R"("number":3)")),
               HasSubstr("line 4: \"sequence\" is missing"));
@@ -141,27 +141,26 @@ TEST_F(RecordFileTest, RefusesARecordThatWasChanged) {
     EXPECT_NE(refusalOfText(without), "accepted") << i;
   }
   EXPECT_THAT(refusalOfText(changed([](auto& copy) { std::swap(copy[4], copy[5]); })), HasSubstr("line 5: "));
-  EXPECT_THAT(refusalOfText(changed([](auto& copy) { copy[2] = "garbage"; })), HasSubstr("line 3: it is no JSON"));
-  EXPECT_THAT(refusalOfText(changed([](auto& copy) { copy[2] = ""; })), HasSubstr("line 3: it is no JSON"));
+  EXPECT_THAT(refusalOfText(changed([](auto& copy) { copy[2] = "garbage"; })), HasSubstr("line 3: not valid JSON"));
+  EXPECT_THAT(refusalOfText(changed([](auto& copy) { copy[2] = ""; })), HasSubstr("line 3: not valid JSON"));
   EXPECT_THAT(refusalOfText(changed([](auto& copy) { copy[2] = "[2]"; })), HasSubstr("line 3: there is no object"));
-  EXPECT_THAT(refusalOfText(replaced(2, "stageBegan", "stageBegun")),
-              HasSubstr("line 3: there is no event 'stageBegun'"));
+  EXPECT_THAT(refusalOfText(replaced(2, "stageBegan", "stageBegun")), HasSubstr("line 3: unknown event 'stageBegun'"));
   EXPECT_THAT(refusalOfText(replaced(0, R"("record":1)", R"("record":2)")),
-              HasSubstr("line 1: it has form 2, and this program reads form 1"));
+              HasSubstr("line 1: the record has format 2, but this program reads format 1"));
   EXPECT_THAT(refusalOfText(replaced(0, R"("record":1)", R"("recorder":1)")), HasSubstr("\"record\" is missing"));
 }
 
 TEST_F(RecordFileTest, RefusesWhatIsNoRecord) {
-  EXPECT_THAT(refusalOfText(""), HasSubstr("holds no event"));
-  EXPECT_THAT(refusalOfText("no end of the line"), HasSubstr("holds no event"));
-  EXPECT_THAT(refusalOfText("\n"), HasSubstr("line 1: it is no JSON"));
+  EXPECT_THAT(refusalOfText(""), HasSubstr("contains no events"));
+  EXPECT_THAT(refusalOfText("no end of the line"), HasSubstr("contains no events"));
+  EXPECT_THAT(refusalOfText("\n"), HasSubstr("line 1: not valid JSON"));
   EXPECT_THAT(refusalOfText(std::string("\x7f"
                                         "ELF\x02\x01\0\0\n",
                                         9)),
-              HasSubstr("line 1: it is no JSON"));
+              HasSubstr("line 1: not valid JSON"));
   EXPECT_THAT(refusalOfText("{\"schema\": 1}\n"), HasSubstr("line 1: \"record\" is missing"));
   EXPECT_THAT(refusalOfText("{\"sequence\":0,\"record\":1,\"event\":\"diagnosticCompleted\"}\n"),
-              HasSubstr("line 1: a record begins with the event runBegan"));
+              HasSubstr("line 1: the first event of a record must be runBegan"));
 }
 
 TEST_F(RecordFileTest, RefusesWhatCannotBeRead) {

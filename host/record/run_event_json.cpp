@@ -30,27 +30,27 @@ T get(const Json& json, const char* key) {
     if (fits) return member.get<T>();
   } catch (const Json::exception&) {
   }
-  throw BadRecord(std::string("\"") + key + "\" is of the wrong kind");
+  throw BadRecord(std::string("\"") + key + "\" has the wrong type");
 }
 
 std::string textAt(const Json& json, const char* key) { return textFrom(memberOf(json, key)); }
 
 Date dateAt(const Json& json, const char* key) {
   const std::optional<Date> date = parseTimestamp(get<std::string>(json, key));
-  if (!date) throw BadRecord(std::string("\"") + key + "\" is no time stamp");
+  if (!date) throw BadRecord(std::string("\"") + key + "\" is not a timestamp");
   return *date;
 }
 
 const Json& arrayAt(const Json& json, const char* key) {
   const Json& array = memberOf(json, key);
-  if (!array.is_array()) throw BadRecord(std::string("\"") + key + "\" is no array");
+  if (!array.is_array()) throw BadRecord(std::string("\"") + key + "\" is not an array");
   return array;
 }
 
 Stage stageAt(const Json& json, const char* key) {
   const std::string name = get<std::string>(json, key);
   const std::optional<Stage> stage = stageNamed(name);
-  if (!stage) throw BadRecord("there is no stage '" + name + "'");
+  if (!stage) throw BadRecord("unknown stage '" + name + "'");
   return *stage;
 }
 
@@ -100,7 +100,7 @@ LogLevel levelAt(const Json& json, const char* key) {
   for (const LogLevel level : {LogLevel::kError, LogLevel::kDefault, LogLevel::kDebug}) {
     if (nameOf(level) == name) return level;
   }
-  throw BadRecord("there is no log level '" + name + "'");
+  throw BadRecord("unknown log level '" + name + "'");
 }
 
 Verdict verdictAt(const Json& json, const char* key) {
@@ -108,7 +108,7 @@ Verdict verdictAt(const Json& json, const char* key) {
   for (const Verdict verdict : {Verdict::kPass, Verdict::kFail, Verdict::kError}) {
     if (nameOf(verdict) == name) return verdict;
   }
-  throw BadRecord("there is no verdict '" + name + "'");
+  throw BadRecord("unknown verdict '" + name + "'");
 }
 
 std::chrono::nanoseconds nanosecondsAt(const Json& json, const char* key) {
@@ -204,7 +204,7 @@ Json jsonOf(const MeasurementsAdded& event) {
 RunEvent readMeasured(const Json& json) {
   MeasurementsAdded event;
   for (const Json& one : arrayAt(json, "measurements")) {
-    if (!one.is_array() || one.size() != 2) throw BadRecord("a measurement has not a name and a value");
+    if (!one.is_array() || one.size() != 2) throw BadRecord("expected a measurement: a name and a value");
     event.measurements.emplace_back(textFrom(one[0]), measurementFrom(one[1]));
   }
   return event;
@@ -332,7 +332,7 @@ RunEvent eventFrom(const Json& json) {
   for (const Reader& reader : kReaders) {
     if (reader.name == name) return reader.read(json);
   }
-  throw BadRecord("there is no event '" + name + "'");
+  throw BadRecord("unknown event '" + name + "'");
 }
 
 Json diagnosticJson(const Diagnostic& diagnostic) {

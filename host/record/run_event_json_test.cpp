@@ -28,13 +28,13 @@ std::string problemOf(const Json& json) {
   return "accepted";
 }
 
-struct Row {
+struct EventRow {
   RunEvent event;
   const char* json;
 };
 
 // Each event with everything that it can have.
-std::vector<Row> rows() {
+std::vector<EventRow> rows() {
   RunStarted run = runOf({"Good", "B\xff"});
   run.ofExperiments = true;
   run.seed = UINT64_MAX;
@@ -76,7 +76,7 @@ std::vector<Row> rows() {
 
 TEST(EventJson, HasAFormForEveryEvent) {
   std::set<std::size_t> kinds;
-  for (const Row& row : rows()) {
+  for (const EventRow& row : rows()) {
     EXPECT_EQ(eventJson(row.event).dump(), row.json);
     kinds.insert(row.event.index());
   }
@@ -84,7 +84,7 @@ TEST(EventJson, HasAFormForEveryEvent) {
 }
 
 TEST(EventFrom, ReadsEveryEventBack) {
-  for (const Row& row : rows()) EXPECT_EQ(eventJson(back(row.event)).dump(), row.json);
+  for (const EventRow& row : rows()) EXPECT_EQ(eventJson(back(row.event)).dump(), row.json);
 }
 
 TEST(EventFrom, ReadsBackWhatIsLeftOut) {
@@ -156,7 +156,7 @@ bool isOptional(const std::string& event, const std::string& key) {
 
 TEST(EventFrom, RefusesAnEventWithoutOneOfItsMembers) {
   int removed = 0;
-  for (const Row& row : rows()) {
+  for (const EventRow& row : rows()) {
     const Json whole = Json::parse(row.json);
     for (const auto& [key, ignored] : whole.items()) {
       Json without = whole;
@@ -170,7 +170,7 @@ TEST(EventFrom, RefusesAnEventWithoutOneOfItsMembers) {
 }
 
 TEST(EventFrom, RefusesMembersOfAnotherKind) {
-  for (const Row& row : rows()) {
+  for (const EventRow& row : rows()) {
     const Json whole = Json::parse(row.json);
     for (const auto& [key, member] : whole.items()) {
       for (const char* other : {"null", "0.5", "[0.5]", "{\"a\":0.5}", "\"strange\"", "-1e300"}) {
@@ -193,25 +193,25 @@ TEST(EventFrom, SaysWhatIsWrong) {
   };
   constexpr BadRow kRows[] = {
       {"5", "there is no object"},
-      {R"({"event":5})", "\"event\" is of the wrong kind"},
-      {R"({"event":"runbegan"})", "there is no event 'runbegan'"},
-      {R"({"event":"stageBegan","stage":"pause","date":""})", "there is no stage 'pause'"},
-      {R"({"event":"stageBegan","stage":"run","date":"today"})", "\"date\" is no time stamp"},
+      {R"({"event":5})", "\"event\" has the wrong type"},
+      {R"({"event":"runbegan"})", "unknown event 'runbegan'"},
+      {R"({"event":"stageBegan","stage":"pause","date":""})", "unknown stage 'pause'"},
+      {R"({"event":"stageBegan","stage":"run","date":"today"})", "\"date\" is not a timestamp"},
       {R"({"event":"stageEnded","stage":"run","date":"2026-11-21T01:08:00.000000000Z","nanoseconds":1.5})",
-       "\"nanoseconds\" is of the wrong kind"},
+       "\"nanoseconds\" has the wrong type"},
       {R"({"event":"stageEnded","stage":"run","date":"2026-11-21T01:08:00.000000000Z",)"
        R"("nanoseconds":9223372036854775808})",
-       "\"nanoseconds\" is of the wrong kind"},
+       "\"nanoseconds\" has the wrong type"},
       {R"({"event":"log","nanoseconds":1,"level":"loud","text":"","date":"2026-11-21T01:08:00.000000000Z"})",
-       "there is no log level 'loud'"},
+       "unknown log level 'loud'"},
       {R"({"event":"diagnosticEnded","verdict":"maybe","date":"2026-11-21T01:08:00.000000000Z"})",
-       "there is no verdict 'maybe'"},
+       "unknown verdict 'maybe'"},
       {R"({"event":"failed","error":null})", "a failure has no error"},
-      {R"({"event":"measured","measurements":{}})", "\"measurements\" is no array"},
-      {R"({"event":"measured","measurements":[["R"]]})", "a measurement has not a name and a value"},
-      {R"({"event":"measured","measurements":["R"]})", "a measurement has not a name and a value"},
+      {R"({"event":"measured","measurements":{}})", "\"measurements\" is not an array"},
+      {R"({"event":"measured","measurements":[["R"]]})", "expected a measurement: a name and a value"},
+      {R"({"event":"measured","measurements":["R"]})", "expected a measurement: a name and a value"},
       {R"({"event":"faultsCounted","faults":[{"fired":1}]})", "\"fault\" is missing"},
-      {R"({"event":"faultsCounted","faults":[{"fault":{},"fired":-1}]})", "\"fired\" is of the wrong kind"},
+      {R"({"event":"faultsCounted","faults":[{"fault":{},"fired":-1}]})", "\"fired\" has the wrong type"},
   };
   for (const BadRow& row : kRows) EXPECT_THAT(problemOf(Json::parse(row.json)), HasSubstr(row.problem)) << row.json;
 }

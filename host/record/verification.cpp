@@ -29,7 +29,7 @@ class Verifier {
   void take(const RunEvent& event) {
     if (const auto* const failed = std::get_if<Failed>(&event); failed != nullptr && !failed->stage) {
       hostsWord_ = failed->error;  // the host's own, which must follow from the rest
-      if (!builder_.isOpen()) add("a failure stands outside of a diagnostic");
+      if (!builder_.isOpen()) add("a failure is recorded outside of any diagnostic");
       return;
     }
     checkPlace(event);
@@ -42,25 +42,26 @@ class Verifier {
 
  private:
   void checkPlace(const RunEvent& event) {
-    if (ended_) add("there are events after the end of the run");
+    if (ended_) add("events follow the end of the run");
     const bool begins = std::holds_alternative<DiagnosticStarted>(event);
     if (const auto* const began = std::get_if<RunStarted>(&event)) {
-      if (began_) add("the run begins twice");
+      if (began_) add("the run starts twice");
       began_ = true;
       toRun_ = began->names;
     } else if (const auto* const ended = std::get_if<RunEnded>(&event)) {
-      if (builder_.isOpen()) add("the run ends while " + builder_.record().name + " has not ended");
+      if (builder_.isOpen()) add("the run ends before " + builder_.record().name + " has ended");
       if (!ended->interrupted) checkNames();
       ended_ = true;
     } else if (begins == builder_.isOpen()) {
-      add(begins ? builder_.record().name + " has not ended when the next diagnostic begins"
-                 : "an event stands outside of a diagnostic");
+      add(begins ? builder_.record().name + " has not ended when the next diagnostic starts"
+                 : "an event is recorded outside of any diagnostic");
     }
   }
 
   void checkNames() {
     for (const std::string& name : toRun_) {
-      if (std::find(run_.begin(), run_.end(), name) == run_.end()) add(name + " was to run and is missing");
+      if (std::find(run_.begin(), run_.end(), name) == run_.end())
+        add(name + " was selected to run but is missing from the record");
     }
   }
 
@@ -72,11 +73,11 @@ class Verifier {
     if (hostsWord_ != nullptr && isNotRecorded(*hostsWord_)) {
       judged.verdict = Verdict::kError;
     } else if (textOf(hostsWord_) != textOf(due)) {
-      add(formatMessage("%@ has the failure %@ of quazor's own, but %@ follows from its results, limits and errors",
+      add(formatMessage("%@: the recorded error of quazor is %@, but the results, limits and errors give %@",
                         record.name, textOf(hostsWord_), textOf(due)));
     }
     if (judged.verdict != record.verdict) {
-      add(formatMessage("%@ has the verdict %@, but %@ follows from its results, limits and errors", record.name,
+      add(formatMessage("%@: the recorded verdict is %@, but the results, limits and errors give %@", record.name,
                         nameOf(record.verdict), nameOf(judged.verdict)));
     }
   }

@@ -73,8 +73,8 @@ TEST(ProblemsOf, FindsAVerdictThatDoesNotFollow) {
       const std::string right(nameOf(stored));
       stored = verdict;
       EXPECT_THAT(problemsOf(events),
-                  ElementsAre(std::string(name) + " has the verdict " + std::string(nameOf(verdict)) + ", but " +
-                              right + " follows from its results, limits and errors"));
+                  ElementsAre(std::string(name) + ": the recorded verdict is " + std::string(nameOf(verdict)) +
+                              ", but the results, limits and errors give " + right));
     }
   }
 }
@@ -87,38 +87,43 @@ TEST(ProblemsOf, FindsChangesOfWhatTheVerdictFollowsFrom) {
   };
   const double nan = std::numeric_limits<double>::quiet_NaN();
   const Row rows[] = {
-      {"a value that fails", [](Events& e) { replaceResult(e, "Good", resultOf(89)); }, "Good has the verdict pass"},
-      {"a value that passes", [](Events& e) { replaceResult(e, "Bad", resultOf(90)); }, "Bad has the verdict fail"},
+      {"a value that fails", [](Events& e) { replaceResult(e, "Good", resultOf(89)); },
+       "Good: the recorded verdict is pass"},
+      {"a value that passes", [](Events& e) { replaceResult(e, "Bad", resultOf(90)); },
+       "Bad: the recorded verdict is fail"},
       {"a value that is no number", [&](Events& e) { replaceResult(e, "Good", resultOf(nan)); },
-       "Good has the verdict pass"},
+       "Good: the recorded verdict is pass"},
       {"a value that was no number", [](Events& e) { replaceResult(e, "Strange", resultOf(90)); },
-       "Strange has the failure QuazorHostErrorDomain 5"},
-      {"a limit", [](Events& e) { replaceResult(e, "Good", withMinimum(91)); }, "Good has the verdict pass"},
-      {"a unit", [](Events& e) { replaceResult(e, "Good", withUnit("errors")); }, "Good has the verdict pass"},
-      {"no result any more", [](Events& e) { e.erase(find<ResultsReported>(e, "Good")); }, "Good has the verdict pass"},
+       "Strange: the recorded error of quazor is QuazorHostErrorDomain 5"},
+      {"a limit", [](Events& e) { replaceResult(e, "Good", withMinimum(91)); }, "Good: the recorded verdict is pass"},
+      {"a unit", [](Events& e) { replaceResult(e, "Good", withUnit("errors")); }, "Good: the recorded verdict is pass"},
+      {"no result any more", [](Events& e) { e.erase(find<ResultsReported>(e, "Good")); },
+       "Good: the recorded verdict is pass"},
       {"no failing result any more", [](Events& e) { e.erase(find<ResultsReported>(e, "Bad")); },
-       "Bad has the verdict fail"},
+       "Bad: the recorded verdict is fail"},
       {"another result that fails",
        [](Events& e) { std::get<ResultsReported>(*find<ResultsReported>(e, "Good")).results.push_back(resultOf(1)); },
-       "Good has the verdict pass"},
+       "Good: the recorded verdict is pass"},
       {"an error that was not",
        [](Events& e) {
          e.insert(find<DiagnosticCompleted>(e, "Bad"), Failed{Stage::kRun, errorWithMessage("D", 1, "m", nullptr)});
        },
-       "Bad has the verdict fail"},
+       "Bad: the recorded verdict is fail"},
       {"no error any more", [](Events& e) { e.erase(find<Failed>(e, "Broken")); },
-       "Broken has the failure none of quazor's own, but QuazorHostErrorDomain 4 'nothing was measured' follows"},
+       "Broken: the recorded error of quazor is none, but the results, limits and errors give QuazorHostErrorDomain 4 "
+       "'nothing was measured'"},
       {"no failure of quazor's own any more", [](Events& e) { e.erase(find<Failed>(e, "Strange")); },
-       "Strange has the failure none of quazor's own, but QuazorHostErrorDomain 5"},
+       "Strange: the recorded error of quazor is none, but the results, limits and errors give QuazorHostErrorDomain "
+       "5"},
       {"another failure of quazor's own",
        [](Events& e) {
          *find<Failed>(e, "Strange") = Failed{std::nullopt, hostError(HostErrorCode::kNothingMeasured, "no")};
        },
-       "Strange has the failure QuazorHostErrorDomain 4 'no' of quazor's own"},
+       "Strange: the recorded error of quazor is QuazorHostErrorDomain 4 'no'"},
       {"a pass that was not completed", [](Events& e) { e.erase(find<DiagnosticCompleted>(e, "Good")); },
-       "Good has the verdict pass"},
+       "Good: the recorded verdict is pass"},
       {"a failure that was not completed", [](Events& e) { e.erase(find<DiagnosticCompleted>(e, "Bad")); },
-       "Bad has the verdict fail"},
+       "Bad: the recorded verdict is fail"},
   };
   for (const Row& row : rows) {
     EXPECT_THAT(problemsAfter(row.change), testing::Contains(HasSubstr(row.problem))) << row.name;
@@ -132,19 +137,21 @@ TEST(ProblemsOf, FindsThatAnErrorWithResultsWasTakenOut) {
   events.emplace_back(DiagnosticEnded{Verdict::kError, momentAt(9)});
   EXPECT_THAT(problemsOf(events), IsEmpty());
   events.erase(find<Failed>(events, "A"));
-  EXPECT_THAT(problemsOf(events), ElementsAre(HasSubstr("has the verdict error, but pass follows")));
+  EXPECT_THAT(problemsOf(events),
+              ElementsAre(HasSubstr("the recorded verdict is error, but the results, limits and errors give pass")));
 }
 
 TEST(ProblemsOf, TakesTheHostsWordThatItCouldNotWriteARecord) {
   const Failed notRecorded{std::nullopt, hostError(HostErrorCode::kNotRecorded, "the record cannot be written")};
   Events events = wholeRun();
   events.insert(find<DiagnosticEnded>(events, "Good"), notRecorded);
-  EXPECT_THAT(problemsOf(events), ElementsAre(HasSubstr("Good has the verdict pass, but error follows")));
+  EXPECT_THAT(problemsOf(events), ElementsAre(HasSubstr("Good: the recorded verdict is pass, but error follows")));
   std::get<DiagnosticEnded>(*find<DiagnosticEnded>(events, "Good")).verdict = Verdict::kError;
   EXPECT_THAT(problemsOf(events), IsEmpty());
   const Failed another{std::nullopt, errorWithMessage("Domain", 10, "a plug-in's", nullptr)};
   *find<Failed>(events, "Good") = another;
-  EXPECT_THAT(problemsOf(events), testing::Contains(HasSubstr("Good has the verdict error, but pass follows")));
+  EXPECT_THAT(problemsOf(events),
+              testing::Contains(HasSubstr("Good: the recorded verdict is error, but pass follows")));
 }
 
 TEST(ProblemsOf, FindsEventsThatAreOutOfPlace) {
@@ -154,28 +161,28 @@ TEST(ProblemsOf, FindsEventsThatAreOutOfPlace) {
     const char* problem;
   };
   const Row rows[] = {
-      {"a second beginning", [](Events& e) { e.insert(e.begin() + 1, runOf({})); }, "the run begins twice"},
+      {"a second beginning", [](Events& e) { e.insert(e.begin() + 1, runOf({})); }, "the run starts twice"},
       {"a line between two diagnostics", [](Events& e) { e.insert(e.begin() + 1, Logged{}); },
-       "an event stands outside of a diagnostic"},
+       "an event is recorded outside of any diagnostic"},
       {"a verdict without a diagnostic",
        [](Events& e) {
          e.insert(e.begin() + 1, DiagnosticEnded{Verdict::kPass, momentAt(1)});
        },
-       "an event stands outside of a diagnostic"},
+       "an event is recorded outside of any diagnostic"},
       {"a failure between two diagnostics",
        [](Events& e) {
          e.insert(e.begin() + 1, Failed{std::nullopt, errorWithMessage("D", 1, "m", nullptr)});
        },
-       "a failure stands outside of a diagnostic"},
+       "a failure is recorded outside of any diagnostic"},
       {"a diagnostic that does not end", [](Events& e) { e.erase(find<DiagnosticEnded>(e, "Good")); },
-       "Good has not ended when the next diagnostic begins"},
+       "Good has not ended when the next diagnostic starts"},
       {"a run that ends too early",
        [](Events& e) {
          e.insert(e.begin() + 2, RunEnded{"Good", momentAt(1)});
        },
-       "the run ends while Good has not ended"},
+       "the run ends before Good has ended"},
       {"something after the end", [](Events& e) { e.emplace_back(beginningOf("Late")); },
-       "there are events after the end of the run"},
+       "events follow the end of the run"},
   };
   for (const Row& row : rows) {
     EXPECT_THAT(problemsAfter(row.change), testing::Contains(row.problem)) << row.name;
@@ -186,7 +193,7 @@ TEST(ProblemsOf, FindsADiagnosticThatWasTakenOut) {
   const auto without = [](Events& events) {
     events.erase(find<DiagnosticStarted>(events, "Bad"), find<DiagnosticStarted>(events, "Strange"));
   };
-  EXPECT_THAT(problemsAfter(without), ElementsAre("Bad was to run and is missing"));
+  EXPECT_THAT(problemsAfter(without), ElementsAre("Bad was selected to run but is missing from the record"));
   EXPECT_THAT(problemsAfter([&](Events& events) {
                 without(events);
                 events.back() = RunEnded{"Broken", momentAt(99)};  // as if it had not come so far

@@ -31,7 +31,7 @@ std::string rangeOf(const Array& samples) {
     if (lowest == nullptr || number < toDouble(lowest)) lowest = &sample;
     if (highest == nullptr || number > toDouble(highest)) highest = &sample;
   }
-  if (lowest == nullptr) return "none of them finite";
+  if (lowest == nullptr) return "none finite";
   return formatMessage("min %@, max %@", *lowest, *highest);
 }
 

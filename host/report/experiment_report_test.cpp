@@ -102,7 +102,7 @@ TEST(PrintAuxiliaryData, TellsLowestAndHighestAsTheyAre) {
   EXPECT_THAT(rangeOf(-2147483648, 18446744073709551615U), HasSubstr("min -2147483648, max 18446744073709551615\n"));
   EXPECT_THAT(rangeOf(36.6F, -0.5), HasSubstr("min -0.5, max 36.6\n"));
   EXPECT_THAT(rangeOf(nan, 3), HasSubstr("min 0, max 3\n"));
-  EXPECT_EQ(printed({{"s", Array{nan, nan, nan, nan, nan, nan, nan, nan}}}), "  s: 8 samples, none of them finite\n");
+  EXPECT_EQ(printed({{"s", Array{nan, nan, nan, nan, nan, nan, nan, nan}}}), "  s: 8 samples, none finite\n");
 }
 
 TEST(PrintAuxiliaryData, KeepsImagesWithin80Columns) {

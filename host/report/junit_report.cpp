@@ -53,9 +53,9 @@ void addResult(JUnitSuite& suite, const JudgedResult& judged) {
   if (const std::string problem = judgeResult(result).problem; !problem.empty()) {
     return suite.addError(result.name(), properties, hostError(HostErrorCode::kCannotBeJudged, problem));
   }
-  suite.addFailure(result.name(), properties,
-                   formatMessage("%@ is %@, and its limit %@", result.name(), valueText(result.measurement()),
-                                 limitText(result.limit())));
+  suite.addFailure(
+      result.name(), properties,
+      formatMessage("%@ is %@, limit %@", result.name(), valueText(result.measurement()), limitText(result.limit())));
 }
 
 // What an experiment on its own measured.
@@ -115,12 +115,12 @@ std::string junitReport(const RunStarted& run, const std::vector<DiagnosticRecor
   if (unfinished.interrupted) {
     const std::string& name = *unfinished.interrupted;
     JUnitSuite suite = suiteOfUnfinished(run, name.empty() ? "quazor" : name, end);
-    suite.addError("interrupted", {}, interruptionOf(name));
+    suite.addError("interrupted", {}, interruptionOf(run, name));
     add(suite);
   }
   for (const std::string& name : unfinished.neverRun) {
     JUnitSuite suite = suiteOfUnfinished(run, name, end);
-    suite.addSkipped("never-run", "The run ended before this was run.");
+    suite.addSkipped("never-run", "The run ended before this was started.");
     add(suite);
   }
   return "<?xml version=\"1.0\" encoding=\"UTF-8\"?>\n" + junitTag("testsuites", "quazor", counts, run.date) + suites +

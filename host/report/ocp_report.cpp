@@ -150,7 +150,7 @@ Json diagnosisJson(const JudgedResult& judged, bool known) {
   const QZMeasuredResult& result = judged.result;
   return {{"verdict", result.name() + ending},
           {"type", type},
-          {"message", formatMessage("%@ is %@ %@, and its limit %@", result.name(), result.measurement().value(),
+          {"message", formatMessage("%@ is %@ %@, limit %@", result.name(), result.measurement().value(),
                                     result.measurement().unit().symbol(), limitText(result.limit()))}};
 }
 
@@ -226,7 +226,7 @@ class RecordWriter {
       stream_.addToStep(kExperimentStep, "diagnosis",
                         {{"verdict", "not-judged"},
                          {"type", "UNKNOWN"},
-                         {"message", "The experiment ran on its own: it returned a result, and nothing was judged."}},
+                         {"message", "The experiment was run on its own and returned a result; nothing was judged."}},
                         stepEnd_);
     }
     endStep(kExperimentStep, record_.errorStage && isOfExperiment(*record_.errorStage), false);
@@ -291,14 +291,14 @@ std::string ocpReport(const RunStarted& run, const std::vector<DiagnosticRecord>
     OcpStream stream(report, noLog, end);
     stream.addToRun("testRunStart",
                     startJson(run, name, commandOf(run, betweenTwo ? run.names : std::vector{name}, {})), end);
-    addErrors(interruptionOf(*unfinished.interrupted),
+    addErrors(interruptionOf(run, *unfinished.interrupted),
               [&stream, end](Json error) { stream.addToRun("error", std::move(error), end); });
     stream.end("ERROR", "NOT_APPLICABLE", end);
   }
   for (const std::string& name : unfinished.neverRun) {
     OcpStream stream(report, noLog, end);
     stream.addToRun("testRunStart", startJson(run, name, commandOf(run, {name}, {})), end);
-    stream.addToRun("log", {{"severity", "INFO"}, {"message", "The run ended before this was run."}}, end);
+    stream.addToRun("log", {{"severity", "INFO"}, {"message", "The run ended before this was started."}}, end);
     stream.end("SKIP", "NOT_APPLICABLE", end);
   }
   return report;

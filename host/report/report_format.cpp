@@ -56,8 +56,9 @@ OutputRequest parseOutput(const std::string& text, Format usual) {
   if (const std::optional<Format> format = formatNamed(word)) return {*format, text.substr(colon + 1)};
   std::vector<std::string> names;
   for (const Format format : kFormats) names.emplace_back(nameOf(format));
-  throw CommandError(ExitCode::kUsage, "--output '" + text + "': there is no format '" + word +
-                                           "' (a file of this name is './" + text + "')" + didYouMean(word, names));
+  throw CommandError(ExitCode::kUsage, "--output '" + text + "': unknown format '" + word +
+                                           "' (for a file of this name, write './" + text + "')" +
+                                           didYouMean(word, names));
 }
 
 std::string reportText(Format format, const RunStarted& run, const std::vector<DiagnosticRecord>& records,

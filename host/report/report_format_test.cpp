@@ -35,7 +35,7 @@ TEST(ParseOutput, RefusesAWordBeforeAColonThatIsNoFormat) {
   } catch (const CommandError& refusal) {
     EXPECT_EQ(refusal.code(), ExitCode::kUsage);
     EXPECT_STREQ(refusal.what(),
-                 "--output 'jnuit:report': there is no format 'jnuit' (a file of this name is "
+                 "--output 'jnuit:report': unknown format 'jnuit' (for a file of this name, write "
                  "'./jnuit:report'); did you mean 'junit'?");
   }
 }

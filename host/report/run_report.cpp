@@ -61,13 +61,14 @@ void RunReport::finishRun(const RunEnded& event) {
   }
   console_.out.flush();
   if (interrupted && interrupted->empty()) {
-    console_.err << "quazor: interrupted between two " << (run_.ofExperiments ? "experiments" : "diagnostics") << '\n';
+    console_.err << "quazor: interrupted while no " << (run_.ofExperiments ? "experiment" : "diagnostic")
+                 << " was running\n";
   }
   if (interrupted && !interrupted->empty()) {
     console_.err << "quazor: interrupted while " << printable(*interrupted) << " was running\n";
   }
   if (!console_.out) {
-    console_.err << "quazor: the standard output cannot be written\n";
+    console_.err << "quazor: standard output cannot be written\n";
     allWritten_ = false;
   }
   if (toFile) writeFile({options_.format, options_.output}, interrupted);

@@ -136,7 +136,7 @@ TEST_F(RunReportTest, TellsWhenTheStandardOutputCannotBeWritten) {
   run(report, {Verdict::kPass});
   out_.setstate(std::ios::badbit);
   EXPECT_EQ(end(report), ExitCode::kCannotWrite);
-  EXPECT_EQ(err_.str(), "quazor: the standard output cannot be written\n");
+  EXPECT_EQ(err_.str(), "quazor: standard output cannot be written\n");
 }
 
 class ExperimentReportTest : public RunReportTest {
@@ -189,7 +189,7 @@ TEST_F(ExperimentReportTest, SpeaksOfExperimentsWhenInterruptedBetweenTwo) {
   RunReport report({Format::kCsv, {}}, console_);
   run(report, {Verdict::kPass});
   end(report, "");
-  EXPECT_EQ(err_.str(), "quazor: interrupted between two experiments\n");
+  EXPECT_EQ(err_.str(), "quazor: interrupted while no experiment was running\n");
   EXPECT_THAT(out_.str(), HasSubstr("A,Raw,90,frames\n"));
 }
 
@@ -198,7 +198,7 @@ TEST_F(RunReportTest, PointsOutUnfiredFaults) {
   DiagnosticRecord record = quietRecord("A", Verdict::kPass);
   record.faults[0].fired = 0;
   takeAll(report, eventsOf(record));
-  EXPECT_THAT(err_.str(), HasSubstr("A: a fault of the phone never fired"));
+  EXPECT_THAT(err_.str(), HasSubstr("A: a fault of the simulated phone never fired"));
 }
 
 TEST_F(RunReportTest, WritesWhatIsFinishedWhenInterrupted) {
@@ -224,7 +224,7 @@ TEST_F(RunReportTest, SaysSoWhenInterruptedBetweenTwoDiagnostics) {
   run(report, {Verdict::kPass});
   end(report, "");
   EXPECT_EQ(Json::parse(out_.str())["interrupted"], "");
-  EXPECT_EQ(err_.str(), "quazor: interrupted between two diagnostics\n");
+  EXPECT_EQ(err_.str(), "quazor: interrupted while no diagnostic was running\n");
 }
 
 TEST_F(RunReportTest, WritesFurtherReportsInTheirFormats) {

@@ -90,8 +90,8 @@ std::string count(std::size_t number, std::string_view what) {
 // What stands below the name in a description.
 std::string headline(const Diagnostic& diagnostic) {
   if (!diagnostic.experimentOnly) return diagnostic.summary;
-  if (diagnostic.usedBy.empty()) return "An experiment that no diagnostic uses.";
-  std::string text = "An experiment; used by ";
+  if (diagnostic.usedBy.empty()) return "An experiment. No diagnostic uses it.";
+  std::string text = "An experiment, used by ";
   std::string_view separator;
   for (const std::string& user : diagnostic.usedBy) {
     text += separator;
@@ -161,7 +161,7 @@ void printSummary(std::ostream& out, const std::vector<DiagnosticRecord>& record
 void printUnfiredFaults(std::ostream& out, const DiagnosticRecord& record) {
   for (const DeclaredFault& fault : record.faults) {
     if (fault.fired > 0) continue;
-    out << "quazor: " << printable(record.name) << ": a fault of the phone never fired: "
+    out << "quazor: " << printable(record.name) << ": a fault of the simulated phone never fired: "
         << fault.fault.dump(-1, ' ', true, nlohmann::ordered_json::error_handler_t::replace) << '\n';
   }
 }
@@ -179,7 +179,7 @@ void printList(std::ostream& out, const std::vector<DescribedDiagnostic>& diagno
   ofDiagnostics.print(out, "");
   if (!hasExperiments) return;
   if (hasDiagnostics) out << '\n';
-  out << "Experiments that no diagnostic uses; 'quazor experiment NAME' runs one:\n";
+  out << "Experiments that no diagnostic uses (run one with 'quazor experiment NAME'):\n";
   ofExperiments.print(out, "  ");
 }
 

@@ -126,7 +126,7 @@ TEST(PrintUnfiredFaults, PointsOutOnlyThoseThatNeverFired) {
   record.faults = {{{{"operation", "a"}}, 1}, {{{"operation", "b"}}, 0}};
   std::ostringstream out;
   printUnfiredFaults(out, record);
-  EXPECT_EQ(out.str(), "quazor: Name: a fault of the phone never fired: {\"operation\":\"b\"}\n");
+  EXPECT_EQ(out.str(), "quazor: Name: a fault of the simulated phone never fired: {\"operation\":\"b\"}\n");
 }
 
 DescribedDiagnostic experimentAlone(const std::string& name) {
@@ -153,7 +153,7 @@ TEST(PrintList, HasExperimentsApart) {
   DescribedDiagnostic broken = experimentAlone("X.Broken");
   broken.description.error = hostError(HostErrorCode::kException, "it\033 threw");
   const std::string experiments =
-      "Experiments that no diagnostic uses; 'quazor experiment NAME' runs one:\n"
+      "Experiments that no diagnostic uses (run one with 'quazor experiment NAME'):\n"
       "  X         About it.\n"
       "  X.Broken  could not be described: it\\x1b threw\n";
   EXPECT_EQ(listed({experimentAlone("X"), broken}), experiments);
@@ -172,7 +172,7 @@ TEST(PrintDescriptions, ShowsAnExperimentOnItsOwn) {
   printDescriptions(out, {bound, used});
   EXPECT_EQ(out.str(),
             "X\n"
-            "  An experiment that no diagnostic uses.\n"
+            "  An experiment. No diagnostic uses it.\n"
             "\n"
             "  Experiment X\n"
             "    About it.\n"
@@ -180,7 +180,7 @@ TEST(PrintDescriptions, ShowsAnExperimentOnItsOwn) {
             "    x            2.5  profile p.json  About x.\n"
             "\n"
             "Y\n"
-            "  An experiment; used by D.One, D.Two.\n"
+            "  An experiment, used by D.One, D.Two.\n"
             "\n"
             "  Experiment Y\n"
             "    About it.\n"

@@ -26,7 +26,7 @@ DeadlineSetting parseDeadline(const std::string& text) {
     const std::string name = text.substr(0, equals);
     setting.stage = stageNamed(name);
     if (!setting.stage) {
-      throw CommandError(ExitCode::kUsage, what + "there is no stage '" + name +
+      throw CommandError(ExitCode::kUsage, what + "unknown stage '" + name +
                                                "'; the stages are load, describe, setup, run, teardown and analyse");
     }
     seconds = text.substr(equals + 1);
@@ -35,7 +35,7 @@ DeadlineSetting parseDeadline(const std::string& text) {
   const std::optional<Value> number = parseNumber(seconds, &problem);
   if (!number) throw CommandError(ExitCode::kUsage, what + problem);
   setting.time = std::min<std::chrono::nanoseconds>(nanosecondsFromSeconds(toDouble(&*number)), kMaxLength);
-  if (setting.time.count() <= 0) throw CommandError(ExitCode::kUsage, what + "the time must be above zero seconds");
+  if (setting.time.count() <= 0) throw CommandError(ExitCode::kUsage, what + "the time must be greater than zero");
   return setting;
 }
 

@@ -147,7 +147,7 @@ class Run {
                 [&](DiagnosticErrorPtr* error) {
                   made = factory();
                   if (made == nullptr)
-                    *error = hostError(HostErrorCode::kNothingMade, "the factory of " + name + " made nothing");
+                    *error = hostError(HostErrorCode::kNothingMade, "the factory of " + name + " returned no object");
                   return made != nullptr;
                 }) &&
         attempt("describing " + name, [&](DiagnosticErrorPtr* /*error*/) {
@@ -171,7 +171,7 @@ class Run {
       if (!ready) return nullptr;
     }
     std::unique_ptr<QZAnalysisResult> result;
-    attempt("analyzing of " + name, [&](DiagnosticErrorPtr* error) {
+    attempt("analysis by " + name, [&](DiagnosticErrorPtr* error) {
       result = analysis->analyzeExperimentResult(measured, error);
       return result != nullptr;
     });

@@ -290,12 +290,12 @@ constexpr FailureRow kFailures[] = {
      "QuazorHostErrorDomain 2 setup of FakeAnalysis threw an exception: analysis setup threw", "srta", 0},
     {"AnalyzingFails", Behaviour::kAnalyzingFails, "FakeDomain 6 analyzing failed", "srta", 0},
     {"AnalyzingFailsWithoutError", Behaviour::kAnalyzingFailsWithoutError,
-     "QuazorHostErrorDomain 1 analyzing of FakeAnalysis failed without giving an error", "srta", 0},
+     "QuazorHostErrorDomain 1 analysis by FakeAnalysis failed without giving an error", "srta", 0},
     {"AnalyzingThrows", Behaviour::kAnalyzingThrows,
-     "QuazorHostErrorDomain 2 analyzing of FakeAnalysis threw an exception: analyzing threw", "srta", 0},
+     "QuazorHostErrorDomain 2 analysis by FakeAnalysis threw an exception: analyzing threw", "srta", 0},
     {"NothingMeasured", Behaviour::kNothingMeasured, "QuazorHostErrorDomain 4 nothing was measured", "srta", 0},
     {"BoundInAnotherUnit", Behaviour::kBoundInAnotherUnit,
-     "QuazorHostErrorDomain 5 the result Count cannot be judged: its lower bound is in 'errors' and its value in "
+     "QuazorHostErrorDomain 5 the result Count cannot be judged: its lower bound is in 'errors' but its value is in "
      "'frames'",
      "srta", 2},
     {"NotANumber", Behaviour::kNotANumber,
@@ -320,7 +320,7 @@ TEST_F(DiagnosticRunTest, EndsInAnErrorWhenNothingIsMade) {
   diagnostic_.diagnostic.makeExperiment = [] { return nullptr; };
   const DiagnosticRecord record = run({});
   EXPECT_EQ(record.verdict, Verdict::kError);
-  EXPECT_EQ(textOf(record.error), "QuazorHostErrorDomain 3 the factory of FakeExperiment made nothing");
+  EXPECT_EQ(textOf(record.error), "QuazorHostErrorDomain 3 the factory of FakeExperiment returned no object");
   EXPECT_EQ(record.errorStage, Stage::kDescribe);
   EXPECT_EQ(record.durations.setup, std::nullopt);
 }
@@ -343,7 +343,7 @@ TEST_F(DiagnosticRunTest, EndsInAnErrorWhenAFactoryFailsOnlyForTheRun) {
   };
   const DiagnosticRecord record = run();
   EXPECT_EQ(record.verdict, Verdict::kError);
-  EXPECT_EQ(textOf(record.error), "QuazorHostErrorDomain 3 the factory of FakeAnalysis made nothing");
+  EXPECT_EQ(textOf(record.error), "QuazorHostErrorDomain 3 the factory of FakeAnalysis returned no object");
   EXPECT_EQ(record.errorStage, Stage::kAnalyse);
   EXPECT_EQ(record.measurements.size(), 1U);
 }

@@ -74,29 +74,28 @@ std::string secondsText(std::chrono::nanoseconds time) {
 
 // Why a process ended before its time. `during` is what it was doing.
 DiagnosticErrorPtr errorOf(const Supervised& supervised, const std::string& during, std::chrono::nanoseconds deadline) {
-  const std::string stuck = supervised.end ? std::string() : "; its process cannot be ended";
+  const std::string stuck = supervised.end ? std::string() : "; its process could not be killed";
   switch (supervised.how) {
     case SupervisionEnd::kDeadline:
-      return hostError(HostErrorCode::kDeadline,
-                       during + " took longer than its deadline of " + secondsText(deadline) + stuck);
+      return hostError(HostErrorCode::kDeadline, during + " exceeded its deadline of " + secondsText(deadline) + stuck);
     case SupervisionEnd::kInterrupted:
       return hostError(HostErrorCode::kInterrupted, during + " was interrupted" + stuck);
     case SupervisionEnd::kLineTooLong:
       return hostError(HostErrorCode::kConnectionLost, during + " wrote more than " + std::to_string(kMaxEvent >> 20U) +
-                                                           " MiB in one line of its process' connection to quazor" +
+                                                           " MiB in one line on its process's connection to quazor" +
                                                            stuck);
     case SupervisionEnd::kConnectionLost: break;
     case SupervisionEnd::kEnded: {
       const ProcessEnd& end = *supervised.end;
       if (end.bySignal) {
-        return hostError(HostErrorCode::kCrashed, during + " crashed: its process was ended by " + textOf(end));
+        return hostError(HostErrorCode::kCrashed, during + " crashed: its process was terminated by " + textOf(end));
       }
       if (end.number == kNoConnection) break;
-      return hostError(HostErrorCode::kExited, during + " ended its own process, with " + textOf(end));
+      return hostError(HostErrorCode::kExited, during + " ended its own process with " + textOf(end));
     }
   }
   return hostError(HostErrorCode::kConnectionLost,
-                   during + " closed or overwrote its process' connection to quazor" + stuck);
+                   during + " closed or overwrote its process's connection to quazor" + stuck);
 }
 
 // The files that register the diagnostic and its halves.
@@ -211,7 +210,7 @@ class SurveyAttempt {
   }
 
   void describe(DiagnosticDescription description) {
-    if (survey_.catalogue.size() >= catalogue_.size()) throw BadRecord("there is more described than there is");
+    if (survey_.catalogue.size() >= catalogue_.size()) throw BadRecord("there are more descriptions than diagnostics");
     survey_.catalogue.push_back({catalogue_[survey_.catalogue.size()], std::move(description)});
   }
 

@@ -124,7 +124,7 @@ TEST_F(SurveyTest, LeavesOutAPluginThatEndsItsProcessWhileItIsLoaded) {
   ASSERT_EQ(rest.failed.size(), 1U);
   EXPECT_EQ(rest.failed[0].file, plugin("fatal"));
   EXPECT_EQ(textOf(rest.failed[0].error), "QuazorHostErrorDomain 6 loading the plug-in '" + plugin("fatal").string() +
-                                              "' crashed: its process was ended by signal 6 (SIGABRT)");
+                                              "' crashed: its process was terminated by signal 6 (SIGABRT)");
 }
 
 TEST_F(SurveyTest, IsEmptyWhenNoPluginCanBeLoaded) {
@@ -140,7 +140,7 @@ TEST_F(SurveyTest, EndsALoadingThatTakesTooLong) {
   ASSERT_EQ(none.failed.size(), 1U);
   EXPECT_THAT(textOf(none.failed[0].error),
               testing::AllOf(testing::StartsWith("QuazorHostErrorDomain 8 loading the plug-in '"),
-                             testing::EndsWith("took longer than its deadline of 0.05 s")));
+                             testing::EndsWith("exceeded its deadline of 0.05 s")));
 }
 
 TEST_F(SurveyTest, LeavesOutAPluginThatWritesToItsProcessConnection) {
@@ -157,7 +157,7 @@ TEST_F(SurveyTest, LeavesOutAPluginThatWritesToItsProcessConnection) {
     const PluginScan none = scanPlugins(options_, signals_, everything);
     ASSERT_EQ(none.failed.size(), 1U) << line;
     EXPECT_THAT(textOf(none.failed[0].error),
-                testing::EndsWith("closed or overwrote its process' connection to quazor"))
+                testing::EndsWith("closed or overwrote its process's connection to quazor"))
         << line;
     EXPECT_THAT(none.catalogue, IsEmpty()) << line;
   }
@@ -168,7 +168,7 @@ TEST_F(SurveyTest, GoesOnBehindWhatEndsItsProcessWhileItIsDescribed) {
   EXPECT_THAT(all.failed, IsEmpty());
   ASSERT_THAT(namesIn(all), ElementsAre("Fatal", "Unruly", "FatalExperiment", "UnrulyExperiment"));
   EXPECT_EQ(textOf(all.catalogue[0].description.error),
-            "QuazorHostErrorDomain 7 describing Fatal ended its own process, with exit code 4");
+            "QuazorHostErrorDomain 7 describing Fatal ended its own process with exit code 4");
   EXPECT_EQ(all.catalogue[1].description.error, nullptr);
   EXPECT_TRUE(all.catalogue[1].description.experiment.parameters().contains("way"));
   EXPECT_THAT(textOf(all.catalogue[2].description.error),
@@ -306,18 +306,17 @@ TEST_F(RunTest, TurnsEachEndOfItsProcessIntoAFailureOfTheStage) {
   };
   constexpr Row kRows[] = {
       {"a crash", 1,
-       "QuazorHostErrorDomain 6 the stage run of Unruly crashed: its process was ended by signal 6 (SIGABRT)"},
-      {"an exit", 2, "QuazorHostErrorDomain 7 the stage run of Unruly ended its own process, with exit code 3"},
-      {"a run that does not end", 3,
-       "QuazorHostErrorDomain 8 the stage run of Unruly took longer than its deadline of 0.1 s"},
+       "QuazorHostErrorDomain 6 the stage run of Unruly crashed: its process was terminated by signal 6 (SIGABRT)"},
+      {"an exit", 2, "QuazorHostErrorDomain 7 the stage run of Unruly ended its own process with exit code 3"},
+      {"a run that does not end", 3, "QuazorHostErrorDomain 8 the stage run of Unruly exceeded its deadline of 0.1 s"},
       {"a closed connection", 4,
-       "QuazorHostErrorDomain 9 the stage run of Unruly closed or overwrote its process' connection to quazor"},
+       "QuazorHostErrorDomain 9 the stage run of Unruly closed or overwrote its process's connection to quazor"},
       {"garbage on the connection", 5,
-       "QuazorHostErrorDomain 9 the stage run of Unruly closed or overwrote its process' connection to quazor"},
+       "QuazorHostErrorDomain 9 the stage run of Unruly closed or overwrote its process's connection to quazor"},
       {"a verdict of its own", 6,
-       "QuazorHostErrorDomain 9 the stage run of Unruly closed or overwrote its process' connection to quazor"},
+       "QuazorHostErrorDomain 9 the stage run of Unruly closed or overwrote its process's connection to quazor"},
       {"a failure of quazor's own", 9,
-       "QuazorHostErrorDomain 9 the stage run of Unruly closed or overwrote its process' connection to quazor"},
+       "QuazorHostErrorDomain 9 the stage run of Unruly closed or overwrote its process's connection to quazor"},
   };
   for (const Row& row : kRows) {
     const DiagnosticRecord record = runUnruly(row.way);
@@ -334,7 +333,7 @@ TEST_F(RunTest, TurnsEachEndOfItsProcessIntoAFailureOfTheStage) {
 TEST_F(RunTest, EndsAPluginThatWritesALineWithoutEndToTheConnection) {
   const DiagnosticRecord record = run("unruly", "Unruly", {"way=15"});  // it may take longer than runUnruly lets it
   EXPECT_EQ(textOf(record.error),
-            "QuazorHostErrorDomain 9 the stage run of Unruly wrote more than 64 MiB in one line of its process' "
+            "QuazorHostErrorDomain 9 the stage run of Unruly wrote more than 64 MiB in one line on its process's "
             "connection to quazor");
   EXPECT_EQ(record.errorStage, Stage::kRun);
   EXPECT_FALSE(isCompleted_);
@@ -369,7 +368,7 @@ TEST_F(RunTest, KeepsNoMoreThanFourMegabytesOfWhatThePluginPrints) {
 
 TEST_F(RunTest, EndsAStageAtItsDeadlineHoweverMuchItLogs) {
   const DiagnosticRecord record = runUnruly(13);
-  EXPECT_THAT(textOf(record.error), HasSubstr("took longer than its deadline of 0.1 s"));
+  EXPECT_THAT(textOf(record.error), HasSubstr("exceeded its deadline of 0.1 s"));
   EXPECT_THAT(logOf(record), testing::Contains("again"));
 }
 
