@@ -52,12 +52,7 @@ const struct Row {
      "CameraSyncExperiment.Front", "CameraSyncAnalysis.Front"},
 };
 
-Scenario healthyPhone() {
-  std::string problem;
-  std::optional<Scenario> scenario = readScenario(QUAZOR_SCENARIOS "/healthy.json", &problem);
-  EXPECT_TRUE(scenario) << problem;
-  return *scenario;
-}
+Scenario healthyPhone() { return readScenario(QUAZOR_SCENARIOS "/healthy.json"); }
 
 class Catalogue : public ::testing::Test {
  protected:

@@ -23,7 +23,7 @@ struct FaultTargets {
   std::optional<std::vector<std::string>> featureReports;  // as hidReportName() writes them; not there: any ID
 };
 
-// Both throw JsonProblem, "PATH: ...", and are called on any thread.
+// Both throw InputError, "PATH: ...", and are called on any thread.
 
 // An array of faults, each with what it acts on checked against `targets`.
 std::vector<Fault> readFaults(const JsonCursor& cursor, const FaultTargets& targets);

@@ -32,7 +32,7 @@ std::string read(const std::string& text, const FaultTargets& targets = smallTar
   const nlohmann::ordered_json document = nlohmann::ordered_json::parse(text);
   try {
     return faultJson(readFaults(JsonCursor(document), targets).at(0)).dump();
-  } catch (const JsonProblem& problem) {
+  } catch (const InputError& problem) {
     return problem.what();
   }
 }

@@ -1,5 +1,7 @@
 #include "backends/threads/system_log.h"
 
+#include "base/text/utf8.h"
+
 #include <syslog.h>
 
 #include <utility>
@@ -8,10 +10,10 @@ namespace quazor {
 
 namespace {
 
-// Cuts between UTF-8 characters: all but the first byte of one, three at most, are 10xxxxxx.
+// Cuts between UTF-8 characters, which have at most three bytes after their first.
 std::string_view cut(std::string_view text, std::size_t size) {
   if (text.size() <= size) return text;
-  for (int i = 0; i < 3 && (static_cast<unsigned char>(text[size]) & 0xC0U) == 0x80U; ++i) --size;
+  for (int i = 0; i < 3 && continuesUtf8(text[size]); ++i) --size;
   return text.substr(0, size);
 }
 

@@ -1,7 +1,9 @@
 #include "base/json/json_cursor.h"
 
+#include "base/text/input_error.h"
+#include "base/text/nearest_name.h"
+
 #include <algorithm>
-#include <numeric>
 
 namespace quazor {
 namespace {
@@ -16,41 +18,32 @@ std::string described(const Json& value) {
   }
 }
 
-// How many characters have to be inserted, deleted or replaced to make one text of the other (Levenshtein 1966).
-std::size_t editDistance(std::string_view a, std::string_view b) {
-  std::vector<std::size_t> row(b.size() + 1);  // distances of a's beginning to all beginnings of b
-  std::iota(row.begin(), row.end(), std::size_t{0});
-  for (std::size_t i = 0; i < a.size(); ++i) {
-    std::size_t diagonal = std::exchange(row[0], i + 1);
-    for (std::size_t j = 0; j < b.size(); ++j) {
-      const std::size_t replaced = diagonal + (a[i] == b[j] ? 0 : 1);
-      diagonal = row[j + 1];
-      row[j + 1] = std::min({replaced, row[j] + 1, diagonal + 1});
-    }
-  }
-  return row.back();
-}
-
 }  // namespace
 
 std::string inQuotes(std::string_view name) { return Json(name).dump(); }
 
 std::string suggestion(std::string_view name, std::span<const std::string_view> names) {
   if (names.empty()) return ".";
-  const auto distance = [name](std::string_view candidate) { return editDistance(name, candidate); };
-  const std::string_view nearest = *std::ranges::min_element(names, {}, distance);
-  if (distance(nearest) * 3 <= std::max(name.size(), nearest.size()))
-    return "; did you mean " + inQuotes(nearest) + "?";
+  if (const auto nearest = nearestName(name, {names.begin(), names.end()})) {
+    return "; did you mean " + inQuotes(*nearest) + "?";
+  }
   std::string known;
   for (const std::string_view candidate : names) known += (known.empty() ? "" : ", ") + inQuotes(candidate);
   return "; known are " + known + ".";
 }
 
-void JsonCursor::fail(const std::string& sentence) const { throw JsonProblem(path_, sentence); }
+void JsonCursor::fail(const std::string& sentence) const { fail(sentence, path_); }
+
+void JsonCursor::fail(const std::string& sentence, const std::string& place) const {
+  if (document_ != nullptr) document_->fail(path_, sentence, place);
+  throw InputError(sentenceAbout(path_, sentence));
+}
 
 void JsonCursor::failType(const std::string& expected) const {
   fail("must be " + expected + ", not " + described(*value_) + ".");
 }
+
+JsonCursor JsonCursor::inside(const Json& value, std::string path) const { return {value, std::move(path), document_}; }
 
 const Json& JsonCursor::object() const {
   if (!value_->is_object()) failType("an object");
@@ -60,7 +53,7 @@ const Json& JsonCursor::object() const {
 void JsonCursor::allowKeys(std::initializer_list<std::string_view> keys) const {
   for (const auto& [key, value] : object().items()) {
     if (std::ranges::find(keys, key) != keys.end()) continue;
-    throw JsonProblem(path_, "there is no key " + inQuotes(key) + suggestion(key, keys), jsonPath(path_, key));
+    fail("there is no key " + inQuotes(key) + suggestion(key, keys), jsonPath(path_, key));
   }
 }
 
@@ -72,13 +65,13 @@ JsonCursor JsonCursor::at(std::string_view key) const {
 std::optional<JsonCursor> JsonCursor::find(std::string_view key) const {
   const auto entry = object().find(key);
   if (entry == value_->end()) return std::nullopt;
-  return JsonCursor(*entry, jsonPath(path_, key));
+  return inside(*entry, jsonPath(path_, key));
 }
 
 std::vector<std::pair<std::string, JsonCursor>> JsonCursor::entries() const {
   std::vector<std::pair<std::string, JsonCursor>> entries;
   for (const auto& [key, value] : object().items()) {
-    entries.emplace_back(key, JsonCursor(value, jsonPath(path_, key)));
+    entries.emplace_back(key, inside(value, jsonPath(path_, key)));
   }
   return entries;
 }
@@ -86,7 +79,7 @@ std::vector<std::pair<std::string, JsonCursor>> JsonCursor::entries() const {
 std::vector<JsonCursor> JsonCursor::elements() const {
   if (!value_->is_array()) failType("an array");
   std::vector<JsonCursor> elements;
-  for (const Json& value : *value_) elements.push_back(JsonCursor(value, jsonPath(path_, elements.size())));
+  for (const Json& value : *value_) elements.push_back(inside(value, jsonPath(path_, elements.size())));
   return elements;
 }
 
@@ -107,23 +100,24 @@ std::int64_t JsonCursor::integer() const {
   return value_->get<std::int64_t>();
 }
 
-std::uint64_t JsonCursor::integer(std::uint64_t lowest, std::uint64_t highest) const {
+std::uint64_t JsonCursor::integer(std::uint64_t minimum, std::uint64_t maximum) const {
   // A number that was read from a text is unsigned unless it is negative.
-  const bool fits =
-      value_->is_number_unsigned() && value_->get<std::uint64_t>() >= lowest && value_->get<std::uint64_t>() <= highest;
-  if (!fits) failType("an integer from " + std::to_string(lowest) + " to " + std::to_string(highest));
+  const bool fits = value_->is_number_unsigned() && value_->get<std::uint64_t>() >= minimum &&
+                    value_->get<std::uint64_t>() <= maximum;
+  if (!fits && minimum == maximum) failType(std::to_string(minimum));
+  if (!fits) failType("an integer from " + std::to_string(minimum) + " to " + std::to_string(maximum));
   return value_->get<std::uint64_t>();
 }
 
-double JsonCursor::number(double lowest, double highest) const {
-  const bool fits = value_->is_number() && value_->get<double>() >= lowest && value_->get<double>() <= highest;
-  if (!fits) failType("a number from " + Json(lowest).dump() + " to " + Json(highest).dump());
+double JsonCursor::number(double minimum, double maximum) const {
+  const bool fits = value_->is_number() && value_->get<double>() >= minimum && value_->get<double>() <= maximum;
+  if (!fits) failType("a number from " + Json(minimum).dump() + " to " + Json(maximum).dump());
   return value_->get<double>();
 }
 
-double JsonCursor::positiveNumber(double highest) const {
-  const bool fits = value_->is_number() && value_->get<double>() > 0 && value_->get<double>() <= highest;
-  if (!fits) failType("a number above 0 and at most " + Json(highest).dump());
+double JsonCursor::positiveNumber(double maximum) const {
+  const bool fits = value_->is_number() && value_->get<double>() > 0 && value_->get<double>() <= maximum;
+  if (!fits) failType("a number above 0 and at most " + Json(maximum).dump());
   return value_->get<double>();
 }
 

@@ -1,7 +1,7 @@
 // JsonCursor: a value of a JSON document that knows where it stands.
 #pragma once
 
-#include "base/json/json_file.h"
+#include "base/json/json_document.h"
 #include "contract/value.h"
 
 #include <cstddef>
@@ -16,18 +16,21 @@
 
 namespace quazor {
 
-// Reads with checks: every wrong type, unknown key and number out of range throws JsonProblem with "PATH: " and one
-// sentence that says what is wrong and what would be right.
+// Reads with checks: every wrong type, unknown key and number out of range throws InputError, "NAME:LINE: PATH: " and
+// one sentence that says what is wrong and what would be right.
 //
 // Borrows the document.
 // Thread: one at a time.
 class JsonCursor {
  public:
-  explicit JsonCursor(const nlohmann::ordered_json& document) : JsonCursor(document, "") {}
+  explicit JsonCursor(const JsonDocument& document) : JsonCursor(document.value(), "", &document) {}
+  // A value that is in no file: errors have no name and no line.
+  explicit JsonCursor(const nlohmann::ordered_json& value) : JsonCursor(value, "", nullptr) {}
 
   const std::string& path() const { return path_; }
   bool isNull() const { return value_->is_null(); }
   bool isBoolean() const { return value_->is_boolean(); }
+  bool isNumber() const { return value_->is_number(); }
   bool isString() const { return value_->is_string(); }
   bool isObject() const { return value_->is_object(); }
   bool isArray() const { return value_->is_array(); }
@@ -49,10 +52,10 @@ class JsonCursor {
   // Not empty.
   std::string text() const;
   std::int64_t integer() const;
-  std::uint64_t integer(std::uint64_t lowest, std::uint64_t highest) const;
-  double number(double lowest, double highest) const;
+  std::uint64_t integer(std::uint64_t minimum, std::uint64_t maximum) const;
+  double number(double minimum, double maximum) const;
   // Above 0.
-  double positiveNumber(double highest) const;
+  double positiveNumber(double maximum) const;
   // A number, a boolean or a string; whole numbers are signed integers where they fit one.
   Value scalar() const;
   // One of `names`; `what` says what they are: "an action".
@@ -63,19 +66,24 @@ class JsonCursor {
   [[noreturn]] void failType(const std::string& expected) const;
 
  private:
-  JsonCursor(const nlohmann::ordered_json& value, std::string path) : value_(&value), path_(std::move(path)) {}
+  JsonCursor(const nlohmann::ordered_json& value, std::string path, const JsonDocument* document)
+      : value_(&value), path_(std::move(path)), document_(document) {}
 
+  JsonCursor inside(const nlohmann::ordered_json& value, std::string path) const;
+  // What is wrong stands at `place`, which is this path or one in it.
+  [[noreturn]] void fail(const std::string& sentence, const std::string& place) const;
   const nlohmann::ordered_json& object() const;
 
   const nlohmann::ordered_json* value_;
   std::string path_;
+  const JsonDocument* document_;  // null: none
 };
 
 // `"name"`, as a document has it.
 std::string inQuotes(std::string_view name);
 
-// `; did you mean "near"?` when one of `names` is near enough to `name` to be meant, else `; known are "a", "b".`: the
-// end of a sentence about a name that does not exist.
+// `; did you mean "near"?` with the nearestName() of `names`, else `; known are "a", "b".`: the end of a sentence about
+// a name that does not exist.
 std::string suggestion(std::string_view name, std::span<const std::string_view> names);
 
 }  // namespace quazor

@@ -26,4 +26,14 @@ Utf8Sequence firstUtf8Sequence(std::string_view text) {
   return {length, true};
 }
 
+std::optional<std::size_t> findInvalidUtf8(std::string_view text) {
+  std::size_t at = 0;
+  while (at < text.size()) {
+    const Utf8Sequence sequence = firstUtf8Sequence(text.substr(at));
+    if (!sequence.wellFormed) return at;
+    at += sequence.length;
+  }
+  return std::nullopt;
+}
+
 }  // namespace quazor

@@ -39,5 +39,19 @@ TEST(FirstUtf8Sequence, IsACharacterOrAsMuchAsOneCouldHaveBegunWith) {
   }
 }
 
+TEST(FindInvalidUtf8, IsWhereTheFirstCharacterIsNotWellFormed) {
+  EXPECT_EQ(findInvalidUtf8(""), std::nullopt);
+  EXPECT_EQ(findInvalidUtf8("a\xC2\x80\xF0\x9F\x93\xB7z"), std::nullopt);
+  EXPECT_EQ(findInvalidUtf8("\xFFz"), 0U);
+  EXPECT_EQ(findInvalidUtf8("a\xC2\x80\x80z"), 3U);
+  EXPECT_EQ(findInvalidUtf8("ab\xE2\x82"), 2U);
+}
+
+TEST(ContinuesUtf8, IsTrueOfAllButTheFirstByte) {
+  const std::string_view text = "a\xC3\xA9\xF0\x9F\x93\xB7";
+  const bool kExpected[] = {false, false, true, false, true, true, true};
+  for (std::size_t i = 0; i < text.size(); ++i) EXPECT_EQ(continuesUtf8(text[i]), kExpected[i]) << i;
+}
+
 }  // namespace
 }  // namespace quazor

@@ -106,12 +106,12 @@ class RefusalTest(CommandLineTest):
             return '{"schema": 1, "diagnostics": {' + text + "}}"
 
         rows = {
-            "missing": (None, "cannot be read: No such file or directory"),
-            "malformed": ("{", "cannot be parsed"),
-            "schema": ('{"schema": 9, "diagnostics": {}}', 'must say "schema": 1'),
+            "missing": (None, ": there is no such file."),
+            "malformed": ("{", ":1: this is not JSON: "),
+            "schema": ('{"schema": 9, "diagnostics": {}}', 'schema: must be 1, not 9.'),
             "diagnostic": (entry('"Fake.Oen": {}'), "'Fake.Oen', which matches no diagnostic; did you mean 'Fake.One'?"),
             "parameter": (entry('"Fake.*": {"experiment": {"duratoin": 1}}'), "did you mean 'duration'?"),
-            "text": (entry('"Fake.*": {"experiment": {"duration": "1"}}'), "a number must stand there"),
+            "text": (entry('"Fake.*": {"experiment": {"duration": "1"}}'), "duration: must be a number, not"),
         }
         for name, (content, problem) in rows.items():
             with self.subTest(name):

@@ -105,11 +105,16 @@ ExitCode runProgram(const std::vector<std::string>& arguments, const Installatio
   ExitCode code = ExitCode::kInternal;
   const std::optional<Options> options = parseCommandLine(arguments, console.out, console.err, &code);
   if (!options) return code;
+  const auto refused = [&console](const InputError& error, ExitCode because) {
+    console.err << "quazor: " << printable(error.what()) << '\n';
+    return because;
+  };
   try {
     return perform(*options, installation, console);
-  } catch (const CommandError& refusal) {
-    console.err << "quazor: " << printable(refusal.what()) << '\n';
-    return refusal.code();
+  } catch (const CommandError& error) {
+    return refused(error, error.code());
+  } catch (const InputError& error) {  // of a file that was read
+    return refused(error, ExitCode::kCannotRead);
   }
 }
 

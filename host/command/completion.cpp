@@ -120,7 +120,7 @@ class Completer {
         return std::find(words_.begin(), words_.end() - 1, one.diagnostic.name) != words_.end() - 1;
       });
       return described && !named.empty() ? named : all;
-    } catch (const CommandError&) {
+    } catch (const InputError&) {
       return {};
     }
   }

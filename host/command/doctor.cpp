@@ -47,12 +47,12 @@ class Doctor {
   }
 
  private:
-  // `look` returns what there is, or throws the CommandError that says what is wrong.
+  // `look` returns what there is, or throws the InputError that says what is wrong.
   void check(std::string_view kind, const std::string& name, const std::function<std::string()>& look) {
     try {
       tell(true, kind, name, look());
-    } catch (const CommandError& refusal) {
-      tell(false, kind, name, refusal.what());
+    } catch (const InputError& problem) {
+      tell(false, kind, name, problem.what());
     }
   }
 
@@ -90,8 +90,8 @@ class Doctor {
     for (const std::string& name : names) {
       try {
         summaryOfScenario(installation_.scenario(name));
-      } catch (const CommandError& refusal) {
-        tell(false, "phone", name, refusal.what());
+      } catch (const InputError& problem) {
+        tell(false, "phone", name, problem.what());
       }
     }
     checkBindings();
@@ -108,8 +108,8 @@ class Doctor {
     for (const std::string& name : names) {
       try {
         phonesOfBinding(installation_.binding(name));
-      } catch (const CommandError& refusal) {
-        tell(false, "binding", name, refusal.what());
+      } catch (const InputError& problem) {
+        tell(false, "binding", name, problem.what());
       }
     }
   }

@@ -1,6 +1,7 @@
 #include "host/command/explanations.h"
 
 #include "base/json/json_cursor.h"
+#include "base/text/input_error.h"
 #include "base/text/nearest_name.h"
 #include "contract/message_format.h"
 #include "host/error/exit_code.h"
@@ -22,7 +23,7 @@ constexpr std::uint64_t kSchema = 1;
 constexpr std::array<std::string_view, 4> kKinds{"diagnostic", "experiment", "analysis", "result"};
 
 [[noreturn]] void refuse(const std::string& file, const std::string& what) {
-  throw CommandError(ExitCode::kCannotRead, "the explanations in '" + file + "' cannot be used: " + what);
+  throw InputError("the explanations in '" + file + "' cannot be used: " + what);
 }
 
 std::string lineOf(const JsonCursor& cursor) {
@@ -129,21 +130,6 @@ std::vector<std::filesystem::path> filesIn(const std::filesystem::path& director
   return files;
 }
 
-template <class Read>
-std::vector<Explanation> reading(const std::string& file, const Read& read) {
-  nlohmann::ordered_json document;
-  try {
-    document = read();
-  } catch (const JsonProblem& problem) {  // it names the file
-    throw CommandError(ExitCode::kCannotRead, problem.what());
-  }
-  try {
-    return explanationsOf(JsonCursor(document));
-  } catch (const JsonProblem& problem) {
-    refuse(file, problem.what());
-  }
-}
-
 std::optional<std::int64_t> integerOf(std::string_view text) {
   std::int64_t number = 0;
   const auto [end, problem] = std::from_chars(text.data(), text.data() + text.size(), number);
@@ -229,14 +215,14 @@ std::string nearestDomain(const std::vector<Explanation>& explanations, const st
 std::string keyOf(std::string_view domain, std::int64_t code) { return formatMessage("%@:%@", domain, code); }
 
 std::vector<Explanation> parseExplanations(const std::string& file, std::string_view text) {
-  return reading(file, [&] { return parseJson(text, file); });
+  return explanationsOf(JsonCursor(JsonDocument(std::string(text), file)));
 }
 
 std::vector<Explanation> readExplanations(const std::filesystem::path& directory) {
   std::vector<Explanation> all;
   std::map<std::string, std::string> seen;  // what is explained, and the file that does it
   for (const std::filesystem::path& file : filesIn(directory)) {
-    for (Explanation& one : reading(file.string(), [&] { return readJsonFile(file); })) {
+    for (Explanation& one : explanationsOf(JsonCursor(JsonDocument::read(file)))) {
       for (const std::string& key : keysOf(one)) {
         const auto [earlier, isNew] = seen.emplace(key, file.string());
         if (!isNew) refuse(file.string(), "'" + key + "' is already explained in '" + earlier->second + "'.");

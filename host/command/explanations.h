@@ -40,13 +40,12 @@ struct Explanation {
 // "DOMAIN:CODE", by which an error is asked for.
 std::string keyOf(std::string_view domain, std::int64_t code);
 
-// What is in one file. Throws a CommandError (kCannotRead) with one sentence that names the file and the place when the
-// text is not exactly of the form that is known.
+// What is in one file. Throws InputError with one sentence that names the file and the place when the text is not
+// exactly of the form that is known.
 std::vector<Explanation> parseExplanations(const std::string& file, std::string_view text);
 
-// What is in a directory's files NAME.json but NAME.schema.json, in the order of the files' names. Throws a
-// CommandError (kCannotRead) for what cannot be read, for a directory without explanations, and for two explanations of
-// one thing.
+// What is in a directory's files NAME.json but NAME.schema.json, in the order of the files' names. Throws
+// InputError for what cannot be read, for a directory without explanations, and for two explanations of one thing.
 std::vector<Explanation> readExplanations(const std::filesystem::path& directory);
 
 // The explanations that `asked` stands for, in their order: DOMAIN:CODE, a code that one or several domains have, a

@@ -57,15 +57,15 @@ class ParametersTest(CommandLineTest):
 
     def test_what_is_refused_of_files(self):
         rows = [
-            (self.directory / "missing.json", "cannot be read: No such file or directory"),
-            (self.write("empty.json", ""), "cannot be parsed"),
-            (self.directory, "is a directory"),
+            (self.directory / "missing.json", "there is no such file."),
+            (self.write("empty.json", ""), "this is not JSON"),
+            (self.directory, "this is a directory, not a file."),
             (self.profile("typo.json", measurd=1), "did you mean 'measured'?"),
             (self.write("other.json", '{"schema": 1, "diagnostics": {"Fake.Oen": {}}}'), "matches no diagnostic"),
         ]
         for path, problem in rows:
             with self.subTest(problem):
-                self.assert_refused(self.run_fake("--parameters", path), 66, f"the profile '{path}'", problem)
+                self.assert_refused(self.run_fake("--parameters", path), 66, str(path), problem)
         self.assert_refused(self.run_fake("--parameters", ""), 64, "--parameters: the value is empty")
 
     def test_what_is_refused_of_the_environment(self):

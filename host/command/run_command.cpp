@@ -110,9 +110,7 @@ void checkOutputs(const Options& options) {
     regular.push_back(target);
   };
   const auto checkReport = [&check](const std::filesystem::path& file) {
-    if (const std::string why = problemOfOutputFile(file); !why.empty()) {
-      throw CommandError(ExitCode::kCannotWrite, "the output file '" + file.string() + "' cannot be written: " + why);
-    }
+    validateOutputFile(file);
     check(file);
   };
   check(options.record);

@@ -7,7 +7,7 @@
 #include "backends/simulated/scenario/scenario.h"
 #include "backends/simulated/simulated_phone.h"
 #include "backends/threads/system_log.h"
-#include "host/error/exit_code.h"
+#include "base/text/input_error.h"
 
 #include <optional>
 #include <string>
@@ -52,15 +52,12 @@ class PhoneOfBinding final : public Phone {
 };
 
 template <class Content>
-Content contentOf(std::optional<Content> content, const std::string& problem) {
-  if (!content) throw CommandError(ExitCode::kCannotRead, "the simulated phone cannot be created: " + problem);
-  return *std::move(content);
-}
-
-Scenario read(const std::filesystem::path& file) {
-  std::string problem;
-  std::optional<Scenario> scenario = readScenario(file, &problem);
-  return contentOf(std::move(scenario), problem);
+Content read(Content (*readFile)(const std::filesystem::path&), const std::filesystem::path& file) {
+  try {
+    return readFile(file);
+  } catch (const InputError& problem) {
+    throw InputError(std::string("the simulated phone cannot be created: ") + problem.what());
+  }
 }
 
 std::string_view nameOf(Expectation::Verdict verdict) {
@@ -81,7 +78,9 @@ std::optional<ExpectedError> expected(const std::optional<FaultError>& error) {
 
 PhoneMaker phonesOfScenario(const std::filesystem::path& file, bool realTime, std::uint64_t seed) {
   const PhoneTime time = realTime ? PhoneTime::kReal : PhoneTime::kVirtual;
-  return [scenario = read(file), time, seed] { return std::make_unique<PhoneOfScenario>(scenario, time, seed); };
+  return [scenario = read(readScenario, file), time, seed] {
+    return std::make_unique<PhoneOfScenario>(scenario, time, seed);
+  };
 }
 
 std::optional<std::filesystem::path> bindingNamed(const std::filesystem::path& phone) {
@@ -91,9 +90,7 @@ std::optional<std::filesystem::path> bindingNamed(const std::filesystem::path& p
 }
 
 PhoneMaker phonesOfBinding(const std::filesystem::path& file) {
-  std::string problem;
-  std::optional<Binding> binding = readBinding(file, &problem);
-  return [binding = contentOf(std::move(binding), problem)] { return std::make_unique<PhoneOfBinding>(binding); };
+  return [binding = read(readBinding, file)] { return std::make_unique<PhoneOfBinding>(binding); };
 }
 
 PhoneProbe probeThisMachine() {
@@ -108,7 +105,7 @@ std::shared_ptr<LogBackend> systemLogOfThisMachine() {
 }
 
 ScenarioSummary summaryOfScenario(const std::filesystem::path& file) {
-  const Scenario scenario = read(file);
+  const Scenario scenario = read(readScenario, file);
   ScenarioSummary summary{scenario.title, {}, !scenario.faults.empty()};
   for (const auto& [name, one] : scenario.expectations) {
     ExpectedOutcome outcome{one.experiment ? one.experiment->name : name,

@@ -2,7 +2,8 @@
 // docs/exit_codes.md is the public list.
 #pragma once
 
-#include <stdexcept>
+#include "base/text/input_error.h"
+
 #include <string>
 
 namespace quazor {
@@ -19,10 +20,12 @@ enum class ExitCode : int {
   kInterrupted = 130,  // by Ctrl-C
 };
 
-// A request that is refused before anything has been touched. Its text is one clear sentence for the user.
-class CommandError : public std::runtime_error {
+// A request that is refused before anything has been touched. what() is one clear sentence for the user.
+//
+// Thread: any
+class CommandError : public InputError {
  public:
-  CommandError(ExitCode code, const std::string& text) : std::runtime_error(text), code_(code) {}
+  CommandError(ExitCode code, const std::string& text) : InputError(text), code_(code) {}
 
   ExitCode code() const { return code_; }
 

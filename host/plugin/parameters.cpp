@@ -1,5 +1,6 @@
 #include "host/plugin/parameters.h"
 
+#include "base/text/input_error.h"
 #include "base/text/nearest_name.h"
 #include "contract/message_format.h"
 #include "host/error/exit_code.h"
@@ -186,10 +187,11 @@ ParameterOverride parseOverride(const std::string& text, OverridePlace place) {
     setting.name.erase(0, prefix.size());
   }
   if (setting.name.empty()) throw CommandError(ExitCode::kUsage, what + "the parameter name is missing");
-  std::string problem;
-  const std::optional<Value> value = parseNumber(std::string_view(text).substr(equals + 1), &problem);
-  if (!value) throw CommandError(ExitCode::kUsage, what + problem);
-  setting.value = *value;
+  try {
+    setting.value = parseNumber(std::string_view(text).substr(equals + 1));
+  } catch (const InputError& problem) {
+    throw CommandError(ExitCode::kUsage, what + problem.what());
+  }
   return setting;
 }
 

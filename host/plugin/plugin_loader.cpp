@@ -1,5 +1,6 @@
 #include "host/plugin/plugin_loader.h"
 
+#include "base/text/input_error.h"
 #include "base/text/nearest_name.h"
 #include "contract/contract.h"
 #include "host/error/exit_code.h"
@@ -30,7 +31,11 @@ namespace {
 }
 
 void loadPlugin(const std::filesystem::path& file) {
-  if (const std::string problem = problemOfSharedObject(file); !problem.empty()) refusePlugin(file, problem);
+  try {
+    validateSharedObject(file);
+  } catch (const InputError& problem) {
+    refusePlugin(file, problem.what());
+  }
   const QZLab& lab = QZLab::defaultLab();
   const std::size_t registered = lab.registrations().size();
   const std::size_t refused = lab.refusedNames().size();

@@ -48,8 +48,8 @@ struct Profile {
                                  std::string_view parameter) const;
 };
 
-// Reads a profile. Throws a CommandError (kCannotRead) that names the file and the place when it cannot be read or is
-// not exactly of the form above.
+// Reads a profile of at most 16 MiB. Throws InputError that names the file, the line and the place when it cannot be
+// read or is not exactly of the form above.
 Profile readProfile(const std::filesystem::path& file);
 
 // As readProfile, from the file's text.

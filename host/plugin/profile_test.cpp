@@ -1,6 +1,6 @@
 #include "host/plugin/profile.h"
 
-#include "host/error/exit_code.h"
+#include "base/text/input_error.h"
 
 #include <gmock/gmock.h>
 #include <gtest/gtest.h>
@@ -15,9 +15,8 @@ constexpr const char* kFile = "some.json";
 std::string refusalOf(const std::string& text) {
   try {
     parseProfile(kFile, text);
-  } catch (const CommandError& refusal) {
-    EXPECT_EQ(refusal.code(), ExitCode::kCannotRead);
-    return refusal.what();
+  } catch (const InputError& problem) {
+    return problem.what();
   }
   return "accepted";
 }
@@ -54,41 +53,42 @@ TEST(ParseProfile, RefusesWhatIsNotExactlyOfTheForm) {
     const char* problem;
   };
   const Row rows[] = {
-      {"an empty file", "", "cannot be parsed"},
-      {"no JSON", "duration = 3", "cannot be parsed"},
-      {"JSON with something behind", withDiagnostics("{}") + "x", "cannot be parsed"},
-      {"no object", "[]", "at /: an object must stand there"},
-      {"no schema", R"({"diagnostics": {}})", "must say \"schema\": 1"},
-      {"another schema", R"({"schema": 2, "diagnostics": {}})", "must say \"schema\": 1"},
-      {"no diagnostics", R"({"schema": 1})", "holds no \"diagnostics\""},
-      {"diagnostics that are no object", withDiagnostics("3"), "at /diagnostics: an object must stand there"},
+      {"an empty file", "", "1: this is not JSON: "},
+      {"no JSON", "duration = 3", "1: this is not JSON: "},
+      {"JSON with something behind", withDiagnostics("{}") + "x", "1: this is not JSON: "},
+      {"no object", "[]", "1: the document: must be an object, not an array."},
+      {"no schema", R"({"diagnostics": {}})", "1: the document: the key \"schema\" is missing."},
+      {"another schema", "{\"diagnostics\": {},\n\"schema\": 2}", "2: schema: must be 1, not 2."},
+      {"no diagnostics", R"({"schema": 1})", "1: the document: the key \"diagnostics\" is missing."},
+      {"diagnostics that are no object", withDiagnostics("3"), "1: diagnostics: must be an object, not 3."},
       {"an unknown key", R"({"schema": 1, "diagnostic": {}})",
-       "'diagnostic' is not known there; did you mean 'diagnostics'?"},
-      {"an entry that is no object", withDiagnostics(R"({"A": 3})"), "at /diagnostics/A: an object must stand there"},
+       "1: the document: there is no key \"diagnostic\"; did you mean \"diagnostics\"?"},
+      {"an entry that is no object", withDiagnostics(R"({"A": 3})"), "1: diagnostics.A: must be an object, not 3."},
       {"an unknown half", withDiagnostics(R"({"A": {"experimant": {}}})"),
-       "at /diagnostics/A: 'experimant' is not known there; did you mean 'experiment'?"},
+       "1: diagnostics.A: there is no key \"experimant\"; did you mean \"experiment\"?"},
       {"a half that is no object", withDiagnostics(R"({"A": {"analysis": []}})"),
-       "at /diagnostics/A/analysis: an object must stand there"},
+       "1: diagnostics.A.analysis: must be an object, not an array."},
       {"a value that is text", withDiagnostics(R"({"A": {"experiment": {"x": "3"}}})"),
-       "at /diagnostics/A/experiment/x: a number must stand there"},
+       "1: diagnostics.A.experiment.x: must be a number, not \"3\"."},
       {"a value that is a boolean", withDiagnostics(R"({"A": {"experiment": {"x": true}}})"),
-       "at /diagnostics/A/experiment/x: a number must stand there"},
+       "1: diagnostics.A.experiment.x: must be a number, not true."},
       {"a value that is null", withDiagnostics(R"({"A": {"analysis": {"x": null}}})"),
-       "at /diagnostics/A/analysis/x: a number must stand there"},
-      {"a number beyond all numbers", withDiagnostics(R"({"A": {"experiment": {"x": 1e999}}})"), "cannot be parsed"},
-      {"a parameter twice", withDiagnostics(R"({"A": {"experiment": {"x": 1, "x": 2}}})"), "holds 'x' twice"},
+       "1: diagnostics.A.analysis.x: must be a number, not null."},
+      {"a number beyond all numbers", withDiagnostics(R"({"A": {"experiment": {"x": 1e999}}})"),
+       "1: diagnostics.A.experiment.x: the number is too large; a double must hold it."},
+      {"a parameter twice", withDiagnostics(R"({"A": {"experiment": {"x": 1, "x": 2}}})"),
+       "1: diagnostics.A.experiment: the key \"x\" stands twice; leave one of the two."},
       {"experiments that are no object", R"({"schema": 1, "diagnostics": {}, "experiments": 3})",
-       "at /experiments: an object must stand there"},
+       "1: experiments: must be an object, not 3."},
       {"an experiment that is no object", R"({"schema": 1, "diagnostics": {}, "experiments": {"E": 3}})",
-       "at /experiments/E: an object must stand there"},
+       "1: experiments.E: must be an object, not 3."},
       {"an experiment's value that is text", R"({"schema": 1, "diagnostics": {}, "experiments": {"E": {"x": "3"}}})",
-       "at /experiments/E/x: a number must stand there"},
-      {"an entry twice", withDiagnostics(R"({"A": {}, "A": {}})"), "holds 'A' twice"},
+       "1: experiments.E.x: must be a number, not \"3\"."},
+      {"an entry twice", withDiagnostics(R"({"A": {}, "A": {}})"),
+       "1: diagnostics: the key \"A\" stands twice; leave one of the two."},
   };
   for (const Row& row : rows) {
-    EXPECT_THAT(refusalOf(row.text),
-                testing::AllOf(testing::StartsWith("the profile 'some.json' "), testing::HasSubstr(row.problem)))
-        << row.name;
+    EXPECT_THAT(refusalOf(row.text), testing::StartsWith(std::string("some.json:") + row.problem)) << row.name;
   }
 }
 
@@ -126,17 +126,18 @@ TEST(Profile, FindsTheValueForAnExperiment) {
   EXPECT_EQ(profile.find("E.One", Part::kExperiment, "x"), nullptr);
 }
 
-TEST(ReadProfile, RefusesAFileThatIsNotThereAndADirectory) {
+TEST(ReadProfile, RefusesWhatIsNotAFileOfAProfilesSize) {
   const auto problemOf = [](const char* file) {
     try {
       readProfile(file);
-    } catch (const CommandError& refusal) {
-      return std::string(refusal.what());
+    } catch (const InputError& problem) {
+      return std::string(problem.what());
     }
     return std::string("accepted");
   };
-  EXPECT_EQ(problemOf("/nowhere/p.json"), "the profile '/nowhere/p.json' cannot be read: No such file or directory");
-  EXPECT_EQ(problemOf("/"), "the profile '/' is a directory");
+  EXPECT_EQ(problemOf("/nowhere/p.json"), "/nowhere/p.json: there is no such file.");
+  EXPECT_EQ(problemOf("/"), "/: this is a directory, not a file.");
+  EXPECT_EQ(problemOf("/dev/zero"), "/dev/zero: the file is larger than 16 MiB.");
 }
 
 TEST(Profile, FindsTheValueOfTheEntryThatWins) {

@@ -1,5 +1,7 @@
 #include "host/plugin/shared_object.h"
 
+#include "base/text/input_error.h"
+
 #include <elf.h>
 
 #include <cerrno>
@@ -40,24 +42,24 @@ bool hasAllSegments(std::ifstream& file, std::uint64_t size) {
 
 }  // namespace
 
-std::string problemOfSharedObject(const std::filesystem::path& path) {
+void validateSharedObject(const std::filesystem::path& path) {
   std::error_code error;
   const std::filesystem::file_status status = std::filesystem::status(path, error);
-  if (status.type() == std::filesystem::file_type::not_found) return "does not exist";
-  if (error) return "cannot be read: " + error.message();
-  if (std::filesystem::is_directory(status)) return "is a directory";
-  if (!std::filesystem::is_regular_file(status)) return "is not a file";
+  if (status.type() == std::filesystem::file_type::not_found) throw InputError("does not exist");
+  if (error) throw InputError("cannot be read: " + error.message());
+  if (std::filesystem::is_directory(status)) throw InputError("is a directory");
+  if (!std::filesystem::is_regular_file(status)) throw InputError("is not a file");
   const std::uint64_t size = std::filesystem::file_size(path, error);
-  if (error) return "cannot be read: " + error.message();
+  if (error) throw InputError("cannot be read: " + error.message());
   std::ifstream file(path, std::ios::binary);
-  if (!file) return std::string("cannot be read: ") + std::strerror(errno);
+  if (!file) throw InputError(std::string("cannot be read: ") + std::strerror(errno));
   unsigned char identity[EI_NIDENT] = {};
   if (!readAt(file, 0, identity, SELFMAG) || std::memcmp(identity, ELFMAG, SELFMAG) != 0) {
-    return "is not a shared object";
+    throw InputError("is not a shared object");
   }
-  if (!readAt(file, 0, identity, EI_NIDENT)) return kTruncated;
-  if (identity[EI_CLASS] != ELFCLASS64) return {};  // another machine's: the linker's to refuse
-  return hasAllSegments(file, size) ? std::string() : kTruncated;
+  if (!readAt(file, 0, identity, EI_NIDENT)) throw InputError(kTruncated);
+  if (identity[EI_CLASS] != ELFCLASS64) return;  // another machine's: the linker's to refuse
+  if (!hasAllSegments(file, size)) throw InputError(kTruncated);
 }
 
 }  // namespace quazor

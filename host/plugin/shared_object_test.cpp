@@ -1,5 +1,6 @@
 #include "host/plugin/shared_object.h"
 
+#include "base/text/input_error.h"
 #include "host/testing/test_directory.h"
 
 #include <gtest/gtest.h>
@@ -17,44 +18,53 @@ std::string ownProgram() {
   return content.str();
 }
 
-TEST(ProblemOfSharedObject, IsNothingForAWholeFile) { EXPECT_EQ(problemOfSharedObject("/proc/self/exe"), ""); }
-
-TEST(ProblemOfSharedObject, TellsWhatAFileIsInstead) {
-  const TestDirectory directory;
-  EXPECT_EQ(problemOfSharedObject(directory.path() / "nothing.so"), "does not exist");
-  EXPECT_EQ(problemOfSharedObject(directory.path()), "is a directory");
-  EXPECT_EQ(problemOfSharedObject("/dev/null"), "is not a file");
-  EXPECT_EQ(problemOfSharedObject(directory.write("empty.so", "")), "is not a shared object");
-  EXPECT_EQ(problemOfSharedObject(directory.write("short.so",
-                                                  "\x7F"
-                                                  "EL")),
-            "is not a shared object");
-  EXPECT_EQ(problemOfSharedObject(directory.write("text.so", "hello, this is text")), "is not a shared object");
+// Empty when nothing is wrong with the file.
+std::string problemOf(const std::filesystem::path& file) {
+  try {
+    validateSharedObject(file);
+  } catch (const InputError& problem) {
+    return problem.what();
+  }
+  return {};
 }
 
-TEST(ProblemOfSharedObject, FindsEveryTruncation) {
+TEST(ValidateSharedObject, TakesAWholeFile) { EXPECT_EQ(problemOf("/proc/self/exe"), ""); }
+
+TEST(ValidateSharedObject, TellsWhatAFileIsInstead) {
+  const TestDirectory directory;
+  EXPECT_EQ(problemOf(directory.path() / "nothing.so"), "does not exist");
+  EXPECT_EQ(problemOf(directory.path()), "is a directory");
+  EXPECT_EQ(problemOf("/dev/null"), "is not a file");
+  EXPECT_EQ(problemOf(directory.write("empty.so", "")), "is not a shared object");
+  EXPECT_EQ(problemOf(directory.write("short.so",
+                                      "\x7F"
+                                      "EL")),
+            "is not a shared object");
+  EXPECT_EQ(problemOf(directory.write("text.so", "hello, this is text")), "is not a shared object");
+}
+
+TEST(ValidateSharedObject, FindsEveryTruncation) {
   const TestDirectory directory;
   const std::string whole = ownProgram();
   ASSERT_GT(whole.size(), 65536U);
   for (const std::size_t size : {std::size_t{4}, std::size_t{16}, std::size_t{63}, std::size_t{64}, std::size_t{100},
                                  std::size_t{4096}, std::size_t{65536}}) {
-    EXPECT_EQ(problemOfSharedObject(directory.write("cut.so", whole.substr(0, size))), "is a truncated shared object")
-        << size;
+    EXPECT_EQ(problemOf(directory.write("cut.so", whole.substr(0, size))), "is a truncated shared object") << size;
   }
 }
 
-TEST(ProblemOfSharedObject, DoesNotBelieveImpossibleOffsets) {
+TEST(ValidateSharedObject, DoesNotBelieveImpossibleOffsets) {
   const TestDirectory directory;
   std::string content = ownProgram();
   for (std::size_t i = 32; i < 40; ++i) content[i] = '\xFF';  // where the program headers are
-  EXPECT_EQ(problemOfSharedObject(directory.write("wild.so", content)), "is a truncated shared object");
+  EXPECT_EQ(problemOf(directory.write("wild.so", content)), "is a truncated shared object");
 }
 
-TEST(ProblemOfSharedObject, LeavesAnotherMachinesFileToTheLinker) {
+TEST(ValidateSharedObject, LeavesAnotherMachinesFileToTheLinker) {
   const TestDirectory directory;
   std::string content = ownProgram();
   content[4] = 1;  // 32 bits
-  EXPECT_EQ(problemOfSharedObject(directory.write("small.so", content)), "");
+  EXPECT_EQ(problemOf(directory.write("small.so", content)), "");
 }
 
 }  // namespace

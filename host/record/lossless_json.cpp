@@ -1,5 +1,8 @@
 #include "host/record/lossless_json.h"
 
+#include "base/text/hexadecimal.h"
+#include "base/text/input_error.h"
+#include "base/text/utf8.h"
 #include "host/record/value_json.h"
 
 #include <cmath>
@@ -15,7 +18,6 @@ using Json = nlohmann::ordered_json;
 
 namespace {
 
-constexpr std::string_view kDigits = "0123456789abcdef";
 // Of values in values: more than anything needs, and few enough for the stack.
 constexpr int kMaxLevels = 500;
 
@@ -29,60 +31,6 @@ class DescribedObject final : public Object {
   const std::string description_;
 };
 
-template <class Octets>
-std::string hexadecimal(const Octets& octets) {
-  std::string text;
-  text.reserve(2 * octets.size());
-  for (const auto octet : octets) {
-    text += kDigits[static_cast<std::uint8_t>(octet) >> 4];
-    text += kDigits[static_cast<std::uint8_t>(octet) & 0x0F];
-  }
-  return text;
-}
-
-template <class Octets>
-Octets octetsOf(const std::string& text) {
-  Octets octets;
-  if (text.size() % 2 != 0) throw BadRecord("odd number of hexadecimal digits");
-  for (std::size_t i = 0; i < text.size(); i += 2) {
-    const std::size_t high = kDigits.find(text[i]);
-    const std::size_t low = kDigits.find(text[i + 1]);
-    if (high == std::string_view::npos || low == std::string_view::npos) throw BadRecord("invalid hexadecimal digit");
-    octets.push_back(static_cast<typename Octets::value_type>(high << 4 | low));
-  }
-  return octets;
-}
-
-// True for well-formed UTF-8 (the Unicode Standard, table 3-7).
-bool isUtf8(std::string_view text) {
-  const auto at = [text](std::size_t i) { return i < text.size() ? static_cast<std::uint8_t>(text[i]) : 0; };
-  const auto between = [](int octet, int low, int high) { return octet >= low && octet <= high; };
-  std::size_t i = 0;
-  while (i < text.size()) {
-    const int first = at(i);
-    std::size_t length = 0;
-    int low = 0x80;
-    int high = 0xBF;
-    if (first < 0x80) {
-      ++i;
-      continue;
-    }
-    if (between(first, 0xC2, 0xDF)) length = 2;
-    if (between(first, 0xE0, 0xEF)) length = 3;
-    if (between(first, 0xF0, 0xF4)) length = 4;
-    if (first == 0xE0) low = 0xA0;
-    if (first == 0xED) high = 0x9F;
-    if (first == 0xF0) low = 0x90;
-    if (first == 0xF4) high = 0x8F;
-    if (length == 0 || !between(at(i + 1), low, high)) return false;
-    for (std::size_t next = 2; next < length; ++next) {
-      if (!between(at(i + next), 0x80, 0xBF)) return false;
-    }
-    i += length;
-  }
-  return true;
-}
-
 Json tagged(const char* tag, Json content) { return Json{{tag, std::move(content)}}; }
 
 template <class T>
@@ -90,26 +38,26 @@ T contentAs(const Json& json, const char* what) {
   try {
     return json.get<T>();
   } catch (const Json::exception&) {
-    throw BadRecord(std::string("expected a ") + what);
+    throw InputError(std::string("expected a ") + what);
   }
 }
 
 std::int64_t signedFrom(const Json& json) {
-  if (!json.is_number_integer()) throw BadRecord("expected an integer");
+  if (!json.is_number_integer()) throw InputError("expected an integer");
   if (json.is_number_unsigned() &&
       json.get<std::uint64_t>() > static_cast<std::uint64_t>(std::numeric_limits<std::int64_t>::max())) {
-    throw BadRecord("integer too large");
+    throw InputError("integer too large");
   }
   return json.get<std::int64_t>();
 }
 
 std::uint64_t unsignedFrom(const Json& json) {
-  if (!json.is_number_unsigned()) throw BadRecord("expected an unsigned integer");
+  if (!json.is_number_unsigned()) throw InputError("expected an unsigned integer");
   return json.get<std::uint64_t>();
 }
 
 const Json& arrayIn(const Json& json) {
-  if (!json.is_array()) throw BadRecord("expected an array");
+  if (!json.is_array()) throw InputError("expected an array");
   return json;
 }
 
@@ -125,7 +73,7 @@ Value arrayFrom(const Json& json, int levels) {
 Dictionary nestedDictionaryFrom(const Json& json, int levels) {
   Dictionary dictionary;
   for (const Json& entry : arrayIn(json)) {
-    if (arrayIn(entry).size() != 2) throw BadRecord("expected an entry of a key and a value");
+    if (arrayIn(entry).size() != 2) throw InputError("expected an entry of a key and a value");
     dictionary.set(textFrom(entry[0]), nestedValueFrom(entry[1], levels));
   }
   return dictionary;
@@ -138,8 +86,8 @@ DiagnosticErrorPtr nestedErrorFrom(const Json& json, int levels) {
 }
 
 Value nestedValueFrom(const Json& json, int levels) {
-  if (levels == 0) throw BadRecord("value nested too deeply");
-  if (!json.is_object() || json.size() != 1) throw BadRecord("expected a value: an object with one key");
+  if (levels == 0) throw InputError("value nested too deeply");
+  if (!json.is_object() || json.size() != 1) throw InputError("expected a value: an object with one key");
   const std::string& kind = json.begin().key();
   const Json& content = json.begin().value();
   if (kind == "boolean") return contentAs<bool>(content, "boolean");
@@ -151,9 +99,12 @@ Value nestedValueFrom(const Json& json, int levels) {
   if (kind == "array") return arrayFrom(content, levels - 1);
   if (kind == "dictionary") return nestedDictionaryFrom(content, levels - 1);
   if (kind == "date") return Date(Date::duration(signedFrom(content)));
-  if (kind == "bytes") return octetsOf<Bytes>(contentAs<std::string>(content, "string"));
+  if (kind == "bytes") {
+    const std::string bytes = parseHexadecimal(contentAs<std::string>(content, "string"));
+    return Bytes(bytes.begin(), bytes.end());
+  }
   if (kind == "error") return nestedErrorFrom(content, levels - 1);
-  if (kind != "object") throw BadRecord("unknown kind of value '" + kind + "'");
+  if (kind != "object") throw InputError("unknown kind of value '" + kind + "'");
   if (content.is_null()) return std::shared_ptr<Object>();
   return std::make_shared<DescribedObject>(textFrom(content));
 }
@@ -165,25 +116,25 @@ Json boundJson(const QZBound* bound) {
 
 std::shared_ptr<const QZBound> boundFrom(const Json& json) {
   if (json.is_null()) return nullptr;
-  if (arrayIn(json).size() != 2) throw BadRecord("expected a bound: a measurement and a boolean");
+  if (arrayIn(json).size() != 2) throw InputError("expected a bound: a measurement and a boolean");
   return std::make_shared<const QZBound>(measurementFrom(json[0]), contentAs<bool>(json[1], "boolean"));
 }
 
 }  // namespace
 
 const Json& memberOf(const Json& json, const char* key) {
-  if (!json.is_object()) throw BadRecord("expected an object");
+  if (!json.is_object()) throw InputError("expected an object");
   const auto found = json.find(key);
-  if (found == json.end()) throw BadRecord(std::string("\"") + key + "\" is missing");
+  if (found == json.end()) throw InputError(std::string("\"") + key + "\" is missing");
   return *found;
 }
 
 Json losslessText(std::string_view text) {
-  return isUtf8(text) ? Json(std::string(text)) : tagged("hex", hexadecimal(text));
+  return !findInvalidUtf8(text) ? Json(std::string(text)) : tagged("hex", hexadecimal(text));
 }
 
 std::string textFrom(const Json& json) {
-  if (json.is_object()) return octetsOf<std::string>(contentAs<std::string>(memberOf(json, "hex"), "string"));
+  if (json.is_object()) return parseHexadecimal(contentAs<std::string>(memberOf(json, "hex"), "string"));
   return contentAs<std::string>(json, "string");
 }
 
@@ -193,7 +144,7 @@ double numberFrom(const Json& json) {
   if (json == "nan") return std::numeric_limits<double>::quiet_NaN();
   if (json == "inf") return std::numeric_limits<double>::infinity();
   if (json == "-inf") return -std::numeric_limits<double>::infinity();
-  if (!json.is_number()) throw BadRecord("expected a number");
+  if (!json.is_number()) throw InputError("expected a number");
   return json.get<double>();
 }
 
@@ -244,7 +195,7 @@ Json losslessMeasurement(const Measurement& measurement) {
 }
 
 Measurement measurementFrom(const Json& json) {
-  if (arrayIn(json).size() != 2) throw BadRecord("expected a measurement: a number and a unit");
+  if (arrayIn(json).size() != 2) throw InputError("expected a measurement: a number and a unit");
   return {numberFrom(json[0]), QZUnit::unitWithSymbol(textFrom(json[1]))};
 }
 

@@ -7,17 +7,10 @@
 
 #include <nlohmann/json.hpp>
 
-#include <stdexcept>
 #include <string>
 #include <string_view>
 
 namespace quazor {
-
-// The JSON is not what a record holds at that place. Its text says what is wrong, for people.
-class BadRecord : public std::runtime_error {
- public:
-  using std::runtime_error::runtime_error;
-};
 
 // A string; {"hex": "..."} for a text that is not UTF-8.
 nlohmann::ordered_json losslessText(std::string_view text);
@@ -47,7 +40,7 @@ Measurement measurementFrom(const nlohmann::ordered_json& json);
 nlohmann::ordered_json losslessResult(const QZMeasuredResult& result);
 QZMeasuredResult resultFrom(const nlohmann::ordered_json& json);
 
-// The entry under `key` of a JSON object. Throws BadRecord when there is none.
+// The entry under `key` of a JSON object. Throws InputError when there is none.
 const nlohmann::ordered_json& memberOf(const nlohmann::ordered_json& json, const char* key);
 
 }  // namespace quazor

@@ -1,5 +1,6 @@
 #include "host/record/lossless_json.h"
 
+#include "base/text/input_error.h"
 #include "host/testing/test_values.h"
 
 #include <gmock/gmock.h>
@@ -24,7 +25,7 @@ Value back(const Value& value) { return valueFrom(throughText(losslessValue(valu
 std::string problemOf(const std::function<void()>& read) {
   try {
     read();
-  } catch (const BadRecord& problem) {
+  } catch (const InputError& problem) {
     return problem.what();
   }
   return "accepted";

@@ -1,5 +1,6 @@
 #include "host/record/record_file.h"
 
+#include "base/text/input_error.h"
 #include "host/error/exit_code.h"
 #include "host/model/record_builder.h"
 #include "host/record/lossless_json.h"
@@ -34,20 +35,18 @@ RunEvent eventInLine(const std::filesystem::path& file, std::uint64_t sequence, 
     if (sequence == 0) {
       const Json& format = memberOf(json, "record");
       if (format != kRecordFormat) {
-        refuseLine(file, 1,
-                   "the record has format " + format.dump() + ", but this program reads format " +
-                       std::to_string(kRecordFormat));
+        throw InputError("the record has format " + format.dump() + ", but this program reads format " +
+                         std::to_string(kRecordFormat));
       }
     }
     if (memberOf(json, "sequence") != sequence) {
-      refuseLine(file, sequence + 1,
-                 "the sequence number is " + memberOf(json, "sequence").dump() + " instead of " +
-                     std::to_string(sequence) + "; a line is missing or has been moved");
+      throw InputError("the sequence number is " + memberOf(json, "sequence").dump() + " instead of " +
+                       std::to_string(sequence) + "; a line is missing or has been moved");
     }
     return eventFrom(json);
   } catch (const Json::exception&) {
     refuseLine(file, sequence + 1, "not valid JSON");
-  } catch (const BadRecord& problem) {
+  } catch (const InputError& problem) {
     refuseLine(file, sequence + 1, problem.what());
   }
 }

@@ -1,5 +1,6 @@
 #include "host/record/run_event_json.h"
 
+#include "base/text/input_error.h"
 #include "host/record/lossless_json.h"
 #include "host/text/timestamp.h"
 
@@ -30,27 +31,27 @@ T get(const Json& json, const char* key) {
     if (fits) return member.get<T>();
   } catch (const Json::exception&) {
   }
-  throw BadRecord(std::string("\"") + key + "\" has the wrong type");
+  throw InputError(std::string("\"") + key + "\" has the wrong type");
 }
 
 std::string textAt(const Json& json, const char* key) { return textFrom(memberOf(json, key)); }
 
 Date dateAt(const Json& json, const char* key) {
   const std::optional<Date> date = parseTimestamp(get<std::string>(json, key));
-  if (!date) throw BadRecord(std::string("\"") + key + "\" is not a timestamp");
+  if (!date) throw InputError(std::string("\"") + key + "\" is not a timestamp");
   return *date;
 }
 
 const Json& arrayAt(const Json& json, const char* key) {
   const Json& array = memberOf(json, key);
-  if (!array.is_array()) throw BadRecord(std::string("\"") + key + "\" is not an array");
+  if (!array.is_array()) throw InputError(std::string("\"") + key + "\" is not an array");
   return array;
 }
 
 Stage stageAt(const Json& json, const char* key) {
   const std::string name = get<std::string>(json, key);
   const std::optional<Stage> stage = stageNamed(name);
-  if (!stage) throw BadRecord("unknown stage '" + name + "'");
+  if (!stage) throw InputError("unknown stage '" + name + "'");
   return *stage;
 }
 
@@ -100,7 +101,7 @@ LogLevel levelAt(const Json& json, const char* key) {
   for (const LogLevel level : {LogLevel::kError, LogLevel::kDefault, LogLevel::kDebug}) {
     if (nameOf(level) == name) return level;
   }
-  throw BadRecord("unknown log level '" + name + "'");
+  throw InputError("unknown log level '" + name + "'");
 }
 
 Verdict verdictAt(const Json& json, const char* key) {
@@ -108,7 +109,7 @@ Verdict verdictAt(const Json& json, const char* key) {
   for (const Verdict verdict : {Verdict::kPass, Verdict::kFail, Verdict::kError}) {
     if (nameOf(verdict) == name) return verdict;
   }
-  throw BadRecord("unknown verdict '" + name + "'");
+  throw InputError("unknown verdict '" + name + "'");
 }
 
 std::chrono::nanoseconds nanosecondsAt(const Json& json, const char* key) {
@@ -204,7 +205,7 @@ Json jsonOf(const MeasurementsAdded& event) {
 RunEvent readMeasured(const Json& json) {
   MeasurementsAdded event;
   for (const Json& one : arrayAt(json, "measurements")) {
-    if (!one.is_array() || one.size() != 2) throw BadRecord("expected a measurement: a name and a value");
+    if (!one.is_array() || one.size() != 2) throw InputError("expected a measurement: a name and a value");
     event.measurements.emplace_back(textFrom(one[0]), measurementFrom(one[1]));
   }
   return event;
@@ -239,7 +240,7 @@ Json jsonOf(const Failed& event) {
 
 RunEvent readFailed(const Json& json) {
   Failed event{std::nullopt, errorFrom(memberOf(json, "error"))};
-  if (event.error == nullptr) throw BadRecord("a failure has no error");
+  if (event.error == nullptr) throw InputError("a failure has no error");
   if (json.contains("stage")) event.stage = stageAt(json, "stage");
   return event;
 }
@@ -332,7 +333,7 @@ RunEvent eventFrom(const Json& json) {
   for (const Reader& reader : kReaders) {
     if (reader.name == name) return reader.read(json);
   }
-  throw BadRecord("unknown event '" + name + "'");
+  throw InputError("unknown event '" + name + "'");
 }
 
 Json diagnosticJson(const Diagnostic& diagnostic) {

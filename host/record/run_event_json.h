@@ -10,16 +10,16 @@ namespace quazor {
 
 nlohmann::ordered_json eventJson(const RunEvent& event);
 
-// Throws BadRecord (host/record/lossless_json.h) for what is no event.
+// Throws InputError for what is no event.
 RunEvent eventFrom(const nlohmann::ordered_json& json);
 
 // What is run: name, summary, halves and who uses it.
 nlohmann::ordered_json diagnosticJson(const Diagnostic& diagnostic);
-// Without factories. Throws BadRecord.
+// Without factories. Throws InputError.
 Diagnostic diagnosticFrom(const nlohmann::ordered_json& json);
 
 nlohmann::ordered_json descriptionJson(const DiagnosticDescription& description);
-// Throws BadRecord.
+// Throws InputError.
 DiagnosticDescription descriptionFrom(const nlohmann::ordered_json& json);
 
 }  // namespace quazor

@@ -1,5 +1,6 @@
 #include "host/record/run_event_json.h"
 
+#include "base/text/input_error.h"
 #include "host/record/lossless_json.h"
 #include "host/testing/test_events.h"
 #include "host/testing/test_values.h"
@@ -22,7 +23,7 @@ RunEvent back(const RunEvent& event) { return eventFrom(Json::parse(eventJson(ev
 std::string problemOf(const Json& json) {
   try {
     eventFrom(json);
-  } catch (const BadRecord& problem) {
+  } catch (const InputError& problem) {
     return problem.what();
   }
   return "accepted";
@@ -234,7 +235,7 @@ TEST(DiagnosticFrom, ReadsADiagnosticBackWithoutItsFactories) {
   EXPECT_TRUE(read.experimentOnly);
   EXPECT_EQ(read.usedBy, diagnostic.usedBy);
   EXPECT_EQ(read.plugins, diagnostic.plugins);
-  EXPECT_THROW(diagnosticFrom(Json::parse(R"({"name":"N"})")), BadRecord);
+  EXPECT_THROW(diagnosticFrom(Json::parse(R"({"name":"N"})")), InputError);
 }
 
 TEST(DescriptionFrom, ReadsADescriptionBack) {
@@ -254,7 +255,7 @@ TEST(DescriptionFrom, ReadsADescriptionBack) {
   EXPECT_TRUE(read.isAsked);
   description.isAsked = false;
   EXPECT_FALSE(descriptionFrom(descriptionJson(description)).isAsked);
-  EXPECT_THROW(descriptionFrom(Json::parse(R"({"experiment":{}})")), BadRecord);
+  EXPECT_THROW(descriptionFrom(Json::parse(R"({"experiment":{}})")), InputError);
 }
 
 }  // namespace

@@ -77,11 +77,12 @@ void RunReport::finishRun(const RunEnded& event) {
 }
 
 void RunReport::writeFile(const OutputRequest& output, const std::optional<std::string>& interrupted) {
-  const std::string why = writeOutputFile(output.file, reportText(output.format, run_, records_, interrupted));
-  if (why.empty()) return;
-  console_.err << "quazor: the output file '" << printable(output.file.string()) << "' cannot be written: " << why
-               << '\n';
-  allWritten_ = false;
+  try {
+    writeOutputFile(output.file, reportText(output.format, run_, records_, interrupted));
+  } catch (const CommandError& problem) {
+    console_.err << "quazor: " << printable(problem.what()) << '\n';
+    allWritten_ = false;
+  }
 }
 
 ExitCode RunReport::exitCode() const { return allWritten_ ? exitCodeOf(records_) : ExitCode::kCannotWrite; }

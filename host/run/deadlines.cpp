@@ -1,5 +1,6 @@
 #include "host/run/deadlines.h"
 
+#include "base/text/input_error.h"
 #include "host/error/exit_code.h"
 #include "host/report/progress.h"
 #include "host/text/parameter_number.h"
@@ -31,10 +32,12 @@ DeadlineSetting parseDeadline(const std::string& text) {
     }
     seconds = text.substr(equals + 1);
   }
-  std::string problem;
-  const std::optional<Value> number = parseNumber(seconds, &problem);
-  if (!number) throw CommandError(ExitCode::kUsage, what + problem);
-  setting.time = std::min<std::chrono::nanoseconds>(nanosecondsFromSeconds(toDouble(&*number)), kMaxLength);
+  try {
+    const Value number = parseNumber(seconds);
+    setting.time = std::min<std::chrono::nanoseconds>(nanosecondsFromSeconds(toDouble(&number)), kMaxLength);
+  } catch (const InputError& problem) {
+    throw CommandError(ExitCode::kUsage, what + problem.what());
+  }
   if (setting.time.count() <= 0) throw CommandError(ExitCode::kUsage, what + "the time must be greater than zero");
   return setting;
 }

@@ -1,5 +1,6 @@
 #include "host/run/isolation.h"
 
+#include "base/text/input_error.h"
 #include "contract/message_format.h"
 #include "host/device/phone.h"
 #include "host/error/exit_code.h"
@@ -204,13 +205,13 @@ class SurveyAttempt {
       }
       return true;
     } catch (const Json::exception&) {
-    } catch (const BadRecord&) {
+    } catch (const InputError&) {
     }
     return false;
   }
 
   void describe(DiagnosticDescription description) {
-    if (survey_.catalogue.size() >= catalogue_.size()) throw BadRecord("there are more descriptions than diagnostics");
+    if (survey_.catalogue.size() >= catalogue_.size()) throw InputError("there are more descriptions than diagnostics");
     survey_.catalogue.push_back({catalogue_[survey_.catalogue.size()], std::move(description)});
   }
 
@@ -279,7 +280,7 @@ class IsolatedRun {
     try {
       event = eventFrom(Json::parse(line));
     } catch (const Json::exception&) {
-    } catch (const BadRecord&) {
+    } catch (const InputError&) {
     }
     if (!event || completed_ || isOfHost(*event)) return false;
     if (const auto* const began = std::get_if<StageStarted>(&*event)) beginStage(began->stage);

@@ -2,7 +2,6 @@
 #pragma once
 
 #include <filesystem>
-#include <string>
 #include <string_view>
 
 namespace quazor {
@@ -12,10 +11,10 @@ namespace quazor {
 // permissions of a file that is replaced are kept. What is no regular file, such as a pipe or a device, is written to
 // as it is.
 //
-// The empty text on success, else why it failed, for people.
-std::string writeOutputFile(const std::filesystem::path& file, std::string_view text);
+// Throws a CommandError (kCannotWrite) that names the file and the reason.
+void writeOutputFile(const std::filesystem::path& file, std::string_view text);
 
-// Why `file` could not be written, as far as that shows without writing; the empty text when nothing speaks against it.
-std::string problemOfOutputFile(const std::filesystem::path& file);
+// Throws the error that writeOutputFile() would, as far as that shows without writing.
+void validateOutputFile(const std::filesystem::path& file);
 
 }  // namespace quazor

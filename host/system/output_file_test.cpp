@@ -1,5 +1,6 @@
 #include "host/system/output_file.h"
 
+#include "host/error/exit_code.h"
 #include "host/testing/test_directory.h"
 
 #include <fcntl.h>
@@ -8,9 +9,11 @@
 #include <sys/stat.h>
 #include <unistd.h>
 
+#include <algorithm>
 #include <csignal>
 #include <iterator>
 #include <string>
+#include <string_view>
 
 namespace quazor {
 namespace {
@@ -21,13 +24,36 @@ std::size_t entriesIn(const fs::path& directory) {
   return static_cast<std::size_t>(std::distance(fs::directory_iterator(directory), fs::directory_iterator()));
 }
 
+// Why the file cannot be written; empty when nothing was thrown.
+template <class Call>
+std::string problemOf(const fs::path& file, const Call& call) {
+  const std::string beginning = "the output file '" + file.string() + "' cannot be written: ";
+  try {
+    call();
+  } catch (const CommandError& problem) {
+    const std::string text = problem.what();
+    EXPECT_EQ(problem.code(), ExitCode::kCannotWrite);
+    EXPECT_EQ(text.substr(0, beginning.size()), beginning);
+    return text.substr(std::min(text.size(), beginning.size()));
+  }
+  return {};
+}
+
+std::string writingOf(const fs::path& file, std::string_view text) {
+  return problemOf(file, [&] { writeOutputFile(file, text); });
+}
+
+std::string validationOf(const fs::path& file) {
+  return problemOf(file, [&] { validateOutputFile(file); });
+}
+
 class OutputFileTest : public testing::Test {
  protected:
   TestDirectory directory_;
 };
 
 TEST_F(OutputFileTest, WritesANewFileAndNothingElse) {
-  EXPECT_EQ(writeOutputFile(directory_.path() / "out", "text"), "");
+  EXPECT_EQ(writingOf(directory_.path() / "out", "text"), "");
   EXPECT_EQ(directory_.read("out"), "text");
   EXPECT_EQ(entriesIn(directory_.path()), 1U);
 }
@@ -35,7 +61,7 @@ TEST_F(OutputFileTest, WritesANewFileAndNothingElse) {
 TEST_F(OutputFileTest, ReplacesAFileAndKeepsItsPermissions) {
   const fs::path file = directory_.write("out", "a longer old text");
   fs::permissions(file, fs::perms::owner_read | fs::perms::owner_write);
-  EXPECT_EQ(writeOutputFile(file, "new"), "");
+  EXPECT_EQ(writingOf(file, "new"), "");
   EXPECT_EQ(directory_.read("out"), "new");
   EXPECT_EQ(fs::status(file).permissions(), fs::perms::owner_read | fs::perms::owner_write);
   EXPECT_EQ(entriesIn(directory_.path()), 1U);
@@ -44,7 +70,7 @@ TEST_F(OutputFileTest, ReplacesAFileAndKeepsItsPermissions) {
 TEST_F(OutputFileTest, FollowsALinkToAFile) {
   directory_.write("target", "old");
   fs::create_symlink("target", directory_.path() / "link");
-  EXPECT_EQ(writeOutputFile(directory_.path() / "link", "new"), "");
+  EXPECT_EQ(writingOf(directory_.path() / "link", "new"), "");
   EXPECT_EQ(directory_.read("target"), "new");
   EXPECT_TRUE(fs::is_symlink(directory_.path() / "link"));
 }
@@ -54,7 +80,7 @@ TEST_F(OutputFileTest, WritesToWhatIsNoRegularFileAsItIs) {
   ASSERT_EQ(mkfifo(pipe.c_str(), 0600), 0);
   const int reader = ::open(pipe.c_str(), O_RDONLY | O_NONBLOCK);
   ASSERT_GE(reader, 0);
-  EXPECT_EQ(writeOutputFile(pipe, "text"), "");
+  EXPECT_EQ(writingOf(pipe, "text"), "");
   char text[8] = {};
   EXPECT_EQ(::read(reader, text, sizeof text), 4);
   EXPECT_STREQ(text, "text");
@@ -69,7 +95,7 @@ TEST_F(OutputFileTest, LeavesTheOldContentAndNothingElseWhenWritingFails) {
   const auto handler = std::signal(SIGXFSZ, SIG_IGN);
   const rlimit small{4, before.rlim_max};  // bytes that a file may have
   ASSERT_EQ(setrlimit(RLIMIT_FSIZE, &small), 0);
-  const std::string problem = writeOutputFile(file, "longer than that");
+  const std::string problem = writingOf(file, "longer than that");
   setrlimit(RLIMIT_FSIZE, &before);
   std::signal(SIGXFSZ, handler);
   EXPECT_EQ(problem, "File too large");
@@ -78,24 +104,24 @@ TEST_F(OutputFileTest, LeavesTheOldContentAndNothingElseWhenWritingFails) {
 }
 
 TEST_F(OutputFileTest, TellsWhyItFailed) {
-  EXPECT_EQ(writeOutputFile(directory_.path() / "nowhere" / "out", "text"), "No such file or directory");
-  EXPECT_EQ(writeOutputFile(directory_.path(), "text"), "it is a directory");
-  EXPECT_EQ(writeOutputFile("/dev/full", "text"), "No space left on device");
-  EXPECT_EQ(writeOutputFile(directory_.write("file", "") / "out", "text"), "Not a directory");
+  EXPECT_EQ(writingOf(directory_.path() / "nowhere" / "out", "text"), "No such file or directory");
+  EXPECT_EQ(writingOf(directory_.path(), "text"), "it is a directory");
+  EXPECT_EQ(writingOf("/dev/full", "text"), "No space left on device");
+  EXPECT_EQ(writingOf(directory_.write("file", "") / "out", "text"), "Not a directory");
 }
 
 TEST_F(OutputFileTest, SaysBeforehandWhatSpeaksAgainstAFile) {
-  EXPECT_EQ(problemOfOutputFile(directory_.path() / "out"), "");
-  EXPECT_EQ(problemOfOutputFile(directory_.write("file", "old")), "");
-  EXPECT_EQ(problemOfOutputFile("relative"), "");
-  EXPECT_EQ(problemOfOutputFile("/dev/null"), "");
-  EXPECT_EQ(problemOfOutputFile(directory_.path()), "it is a directory");
-  EXPECT_EQ(problemOfOutputFile(directory_.path() / "nowhere" / "out"), "No such file or directory");
-  EXPECT_EQ(problemOfOutputFile(directory_.path() / "file" / "out"), "Not a directory");
+  EXPECT_EQ(validationOf(directory_.path() / "out"), "");
+  EXPECT_EQ(validationOf(directory_.write("file", "old")), "");
+  EXPECT_EQ(validationOf("relative"), "");
+  EXPECT_EQ(validationOf("/dev/null"), "");
+  EXPECT_EQ(validationOf(directory_.path()), "it is a directory");
+  EXPECT_EQ(validationOf(directory_.path() / "nowhere" / "out"), "No such file or directory");
+  EXPECT_EQ(validationOf(directory_.path() / "file" / "out"), "Not a directory");
   fs::create_symlink("file", directory_.path() / "link");
-  EXPECT_EQ(problemOfOutputFile(directory_.path() / "link"), "");
+  EXPECT_EQ(validationOf(directory_.path() / "link"), "");
   fs::create_symlink("itself", directory_.path() / "itself");
-  EXPECT_EQ(problemOfOutputFile(directory_.path() / "itself" / "out"), "Too many levels of symbolic links");
+  EXPECT_EQ(validationOf(directory_.path() / "itself" / "out"), "Too many levels of symbolic links");
   EXPECT_EQ(directory_.read("file"), "old");
   EXPECT_EQ(entriesIn(directory_.path()), 3U);
 }

@@ -1,10 +1,12 @@
 #include "host/text/parameter_number.h"
 
+#include "base/text/input_error.h"
 #include "contract/message_format.h"
 
 #include <charconv>
 #include <cmath>
 #include <cstdint>
+#include <optional>
 #include <system_error>
 
 namespace quazor {
@@ -22,24 +24,18 @@ std::optional<Number> parseWhole(std::string_view text, std::errc* error) {
 
 }  // namespace
 
-std::optional<Value> parseNumber(std::string_view text, std::string* problem) {
-  if (text.empty()) {
-    *problem = "a number is missing";
-    return std::nullopt;
-  }
+Value parseNumber(std::string_view text) {
+  if (text.empty()) throw InputError("a number is missing");
   std::errc error{};
-  if (const auto number = parseWhole<std::int64_t>(text, &error)) return Value(*number);
-  if (const auto number = parseWhole<std::uint64_t>(text, &error)) return Value(*number);
+  if (const auto number = parseWhole<std::int64_t>(text, &error)) return *number;
+  if (const auto number = parseWhole<std::uint64_t>(text, &error)) return *number;
   const std::optional<double> number = parseWhole<double>(text, &error);
-  if (number && std::isfinite(*number)) return Value(*number);
-  if (number) {
-    *problem = formatMessage("'%@' is not a finite number", text);
-  } else if (error == std::errc::result_out_of_range) {
-    *problem = formatMessage("'%@' is outside the range of numbers", text);
-  } else {
-    *problem = formatMessage("'%@' is not a number", text);
+  if (error == std::errc::result_out_of_range) {
+    throw InputError(formatMessage("'%@' is outside the range of numbers", text));
   }
-  return std::nullopt;
+  if (!number) throw InputError(formatMessage("'%@' is not a number", text));
+  if (!std::isfinite(*number)) throw InputError(formatMessage("'%@' is not a finite number", text));
+  return *number;
 }
 
 }  // namespace quazor

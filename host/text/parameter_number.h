@@ -3,15 +3,13 @@
 
 #include "contract/value.h"
 
-#include <optional>
-#include <string>
 #include <string_view>
 
 namespace quazor {
 
 // The number that `text` is, all of it: an integer stays one, signed where that holds it and unsigned above; anything
-// else is a double, an integer beyond 64 bits too. Nothing, and one clause in `problem`, for a text that is no decimal
+// else is a double, an integer beyond 64 bits too. Throws InputError, one clause, for a text that is not a decimal
 // number, is not finite, or lies outside the range of doubles. No locale has any influence.
-std::optional<Value> parseNumber(std::string_view text, std::string* problem);
+Value parseNumber(std::string_view text);
 
 }  // namespace quazor

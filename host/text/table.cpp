@@ -1,5 +1,6 @@
 #include "host/text/table.h"
 
+#include "base/text/hexadecimal.h"
 #include "base/text/utf8.h"
 
 #include <algorithm>
@@ -12,8 +13,8 @@ namespace {
 constexpr std::size_t kWidestLine = 80;
 
 std::size_t widthOf(std::string_view text) {
-  return static_cast<std::size_t>(std::count_if(
-      text.begin(), text.end(), [](char unit) { return (static_cast<unsigned char>(unit) & 0xC0) != 0x80; }));
+  return static_cast<std::size_t>(
+      std::count_if(text.begin(), text.end(), [](char unit) { return !continuesUtf8(unit); }));
 }
 
 bool isControl(unsigned char unit) { return unit < 0x20 || unit == 0x7F; }
@@ -24,13 +25,7 @@ bool isWideControl(std::string_view character) {
 }
 
 void appendEscaped(std::string& shown, std::string_view bytes) {
-  constexpr std::string_view kDigits = "0123456789abcdef";
-  for (const char byte : bytes) {
-    const auto unit = static_cast<unsigned char>(byte);
-    shown += "\\x";
-    shown += kDigits[unit >> 4U];
-    shown += kDigits[unit & 0xFU];
-  }
+  for (; !bytes.empty(); bytes.remove_prefix(1)) shown += "\\x" + hexadecimal(bytes.substr(0, 1));
 }
 
 // With what steers a terminal, and what is no text at all, shown as \xNN; but for the characters of `kept`.

@@ -1,12 +1,12 @@
 // Any bytes as a report descriptor: what it says within its bounds, or a reason.
 #include "backends/linux/hid/hid_report_descriptor.h"
+#include "base/text/input_error.h"
 
 #include <cstddef>
 #include <cstdint>
 #include <cstdlib>
 #include <map>
-#include <optional>
-#include <string>
+#include <string_view>
 
 namespace quazor {
 namespace {
@@ -27,13 +27,13 @@ void requireReports(const HidReportDescriptor& descriptor, const std::map<std::u
 }  // namespace quazor
 
 extern "C" int LLVMFuzzerTestOneInput(const std::uint8_t* data, std::size_t size) {
-  std::string problem;
-  const std::optional<quazor::HidReportDescriptor> descriptor =
-      quazor::parseHidReportDescriptor({data, size}, &problem);
-  quazor::require(descriptor.has_value() == problem.empty());
-  if (!descriptor) return 0;
-  quazor::require(descriptor->topLevel.size() <= size);
-  quazor::requireReports(*descriptor, descriptor->inputReports);
-  quazor::requireReports(*descriptor, descriptor->featureReports);
+  try {
+    const quazor::HidReportDescriptor descriptor = quazor::parseHidReportDescriptor({data, size});
+    quazor::require(descriptor.topLevel.size() <= size);
+    quazor::requireReports(descriptor, descriptor.inputReports);
+    quazor::requireReports(descriptor, descriptor.featureReports);
+  } catch (const quazor::InputError& problem) {
+    quazor::require(!std::string_view(problem.what()).empty());
+  }
   return 0;
 }

@@ -1,18 +1,19 @@
 // Any text as a number of the command line: a number that is finite, or a reason.
+#include "base/text/input_error.h"
 #include "host/text/parameter_number.h"
 
 #include <cmath>
 #include <cstddef>
 #include <cstdint>
 #include <cstdlib>
-#include <optional>
-#include <string>
 #include <string_view>
 
 extern "C" int LLVMFuzzerTestOneInput(const std::uint8_t* data, std::size_t size) {
-  std::string problem;
-  const std::optional<quazor::Value> number =
-      quazor::parseNumber(std::string_view(reinterpret_cast<const char*>(data), size), &problem);
-  if (number ? !std::isfinite(quazor::toDouble(&*number)) : problem.empty()) std::abort();
+  try {
+    const quazor::Value number = quazor::parseNumber({reinterpret_cast<const char*>(data), size});
+    if (!std::isfinite(quazor::toDouble(&number))) std::abort();
+  } catch (const quazor::InputError& problem) {
+    if (std::string_view(problem.what()).empty()) std::abort();
+  }
   return 0;
 }

@@ -1,5 +1,5 @@
-// Any text as a profile: a profile, or a refusal with a sentence.
-#include "host/error/exit_code.h"
+// Any text as a profile: a profile, or an error with a sentence.
+#include "base/text/input_error.h"
 #include "host/plugin/profile.h"
 
 #include <cstddef>
@@ -10,8 +10,8 @@
 extern "C" int LLVMFuzzerTestOneInput(const std::uint8_t* data, std::size_t size) {
   try {
     quazor::parseProfile("profile.json", std::string(reinterpret_cast<const char*>(data), size));
-  } catch (const quazor::CommandError& refusal) {
-    if (std::string(refusal.what()).empty()) std::abort();
+  } catch (const quazor::InputError& problem) {
+    if (std::string(problem.what()).empty()) std::abort();
   }
   return 0;
 }

@@ -94,10 +94,7 @@ struct Outcome {
 class CameraSyncSweep : public testing::TestWithParam<Sweep> {
  protected:
   void SetUp() override {
-    std::string problem;
-    auto scenario = readScenario(QUAZOR_SCENARIOS "/healthy.json", &problem);
-    ASSERT_TRUE(scenario) << problem;
-    scenario_ = *std::move(scenario);
+    scenario_ = readScenario(QUAZOR_SCENARIOS "/healthy.json");
     for (CameraGroup& group : scenario_.groups) group.masterConfiguration = GetParam().masterConfiguration;
     phone_ = phoneOf(scenario_);
   }

@@ -38,7 +38,7 @@ ALLOWED = {
     "diagnostics/projector_fault": [*CONTRACT, "diagnostics/report_channels"],
     "diagnostics/sensor_images": CONTRACT,
     "plugins": [*CONTRACT, *DIAGNOSTICS],
-    "backends/threads": CONTRACT,
+    "backends/threads": [*CONTRACT, "base/text"],
     "backends/faults": [*CONTRACT, "base/json", "base/text"],
     "backends/counters": CONTRACT,
     "backends/hid": CONTRACT,
@@ -55,7 +55,7 @@ ALLOWED = {
     LINUX + "binding": [*CONTRACT, "backends/faults", "base/json", "base/text"],
     LINUX + "video": [*CONTRACT, LINUX + "binding", LINUX + "system"],
     LINUX + "capture": [*CONTRACT, LINUX + "binding", LINUX + "system", LINUX + "video"],
-    LINUX + "hid": [*CONTRACT, "backends/hid", LINUX + "system"],
+    LINUX + "hid": [*CONTRACT, "backends/hid", "base/text", LINUX + "system"],
     LINUX + "counters": [*CONTRACT, "backends/counters", LINUX + "binding", LINUX + "system"],
     LINUX + "display": [*CONTRACT, LINUX + "binding"],
 }
@@ -66,7 +66,7 @@ def parts(folder):
     return [name for name in ALLOWED if name.startswith(folder + "/")]
 
 
-ALLOWED[LINUX + "probe"] = [*CONTRACT, *parts("backends/linux")]
+ALLOWED[LINUX + "probe"] = [*CONTRACT, "base/text", *parts("backends/linux")]
 ALLOWED["backends/simulated"] = [*CONTRACT, "backends/faults", "backends/threads", *parts("backends/simulated")]
 ALLOWED["backends/linux"] = [*CONTRACT, "backends/faults", "backends/threads", *parts("backends/linux")]
 BACKENDS = [name for name in ALLOWED if name.startswith("backends/")]

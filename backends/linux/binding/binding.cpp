@@ -239,21 +239,6 @@ Binding bindingOf(const JsonCursor& document) {
 
 }  // namespace
 
-std::optional<Binding> readBinding(const std::filesystem::path& file, std::string* problem) {
-  std::string text;
-  std::string complaint;
-  try {
-    text = readTextFile(file);
-    const nlohmann::ordered_json document = parseJson(text, file.string());
-    return bindingOf(JsonCursor(document));
-  } catch (const JsonProblem& found) {
-    complaint = found.what();
-    if (found.place()) {
-      complaint = file.string() + ":" + std::to_string(lineOfPath(text, *found.place())) + ": " + complaint;
-    }
-  }
-  if (problem != nullptr) *problem = std::move(complaint);
-  return std::nullopt;
-}
+Binding readBinding(const std::filesystem::path& file) { return bindingOf(JsonCursor(JsonDocument::read(file))); }
 
 }  // namespace quazor

@@ -124,8 +124,8 @@ struct Binding {
   std::optional<DisplayBinding> display;  // nothing: the first connector that is connected
 };
 
-// Reads a binding file (data/bindings/binding.schema.json describes its form). On failure nothing, and in `problem` one
-// sentence with the file, the place in it and what would be right.
-std::optional<Binding> readBinding(const std::filesystem::path& file, std::string* problem);
+// Reads a binding file (data/bindings/binding.schema.json describes its form). Throws InputError: one sentence
+// with the file, the place in it and what would be right.
+Binding readBinding(const std::filesystem::path& file);
 
 }  // namespace quazor

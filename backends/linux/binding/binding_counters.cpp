@@ -2,6 +2,7 @@
 
 #include "backends/linux/binding/gauges.h"
 #include "backends/linux/binding/name_pattern.h"
+#include "base/text/input_error.h"
 
 #include <algorithm>
 #include <array>
@@ -29,10 +30,12 @@ constexpr std::array<Part, 3> kParts{{{"group", "{group}", &CounterFilesBinding:
                                       {"name", "{name}", &CounterFilesBinding::name}}};
 
 NamePattern patternIn(const JsonCursor& cursor) {
-  std::string problem;
-  std::optional<NamePattern> pattern = NamePattern::parse(cursor.text(), &problem);
-  if (!pattern) cursor.fail(inQuotes(cursor.text()) + " " + problem);
-  return *pattern;
+  const std::string text = cursor.text();
+  try {
+    return NamePattern::parse(text);
+  } catch (const InputError& problem) {
+    cursor.fail(inQuotes(text) + " " + problem.what());
+  }
 }
 
 // A folder's name with nothing in it but * that stands for anything.

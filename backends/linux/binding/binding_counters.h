@@ -9,7 +9,7 @@
 
 namespace quazor {
 
-// All throw JsonProblem: "PATH: ...".
+// All throw InputError: "PATH: ...".
 std::vector<CounterFilesBinding> readAllCounterFiles(const JsonCursor& cursor);
 std::vector<TracepointBinding> readAllTracepoints(const JsonCursor& cursor);
 // An absolute path that a system call can take, without components that lead back.

@@ -1,5 +1,7 @@
 #include "backends/linux/binding/binding.h"
 
+#include "base/text/input_error.h"
+
 #include <gmock/gmock.h>
 #include <gtest/gtest.h>
 
@@ -28,14 +30,19 @@ class BindingTest : public ::testing::Test {
               ("quazor-binding-" + std::to_string(std::chrono::steady_clock::now().time_since_epoch().count()))) {}
   ~BindingTest() override { fs::remove(file_); }
 
-  std::optional<Binding> read(std::string_view text, std::string* problem = nullptr) {
+  Binding read(std::string_view text) {
     std::ofstream(file_, std::ios::binary) << text;
-    return readBinding(file_, problem);
+    return readBinding(file_);
   }
   // What is wrong, with "F" for the file; "nothing" when it was read.
   std::string problemOf(std::string_view text) {
     std::string problem;
-    if (read(text, &problem)) return "nothing";
+    try {
+      read(text);
+      return "nothing";
+    } catch (const InputError& error) {
+      problem = error.what();
+    }
     const std::size_t at = problem.find(file_.string());
     return at == std::string::npos ? problem : problem.replace(at, file_.string().size(), "F");
   }
@@ -66,8 +73,7 @@ std::string withPath(const std::string& path, const std::string& entries = "\"na
 }
 
 TEST_F(BindingTest, ReadsAllThereIsToSay) {
-  std::string problem;
-  const std::optional<Binding> binding = read(R"({
+  const Binding binding = read(R"({
     "$schema": "binding.schema.json", "title": "Everything", "description": "d",
     "cameras": {
       "FrontFacingInfraredCamera": {
@@ -96,13 +102,11 @@ TEST_F(BindingTest, ReadsAllThereIsToSay) {
     "tracepoints": [{"system": "v4l2", "event": "*"},
                     {"description": "d", "system": "a", "event": "b", "group": "g", "subgroup": "s", "name": "n"}],
     "display": {"description": "d", "connector": "DSI-1"}
-  })",
-                                              &problem);
-  ASSERT_TRUE(binding) << problem;
-  EXPECT_EQ(binding->title, "Everything");
+  })");
+  EXPECT_EQ(binding.title, "Everything");
 
-  ASSERT_EQ(binding->cameras.size(), 2U);
-  const CameraBinding& camera = binding->cameras[0];
+  ASSERT_EQ(binding.cameras.size(), 2U);
+  const CameraBinding& camera = binding.cameras[0];
   EXPECT_EQ(camera.port, "FrontFacingInfraredCamera");
   EXPECT_EQ(camera.node, (VideoNodeMatch{"dr", "ca", "bu"}));
   EXPECT_EQ(camera.width, 640U);
@@ -145,39 +149,38 @@ TEST_F(BindingTest, ReadsAllThereIsToSay) {
   EXPECT_EQ(camera.errorCounters[1].file, std::nullopt);
   EXPECT_EQ(camera.errorCounters[1].control, "E");
 
-  const CameraBinding& second = binding->cameras[1];
+  const CameraBinding& second = binding.cameras[1];
   EXPECT_EQ(second.buffers, 4U);
   EXPECT_FALSE(second.projector);
   EXPECT_FALSE(second.metadata.node);
-  ASSERT_EQ(binding->groups.size(), 1U);
-  EXPECT_THAT(binding->groups[0].ports, ElementsAre("FrontFacingInfraredCamera", "BackFacingCamera"));
-  EXPECT_EQ(binding->groups[0].master, "BackFacingCamera");
+  ASSERT_EQ(binding.groups.size(), 1U);
+  EXPECT_THAT(binding.groups[0].ports, ElementsAre("FrontFacingInfraredCamera", "BackFacingCamera"));
+  EXPECT_EQ(binding.groups[0].master, "BackFacingCamera");
 
-  ASSERT_EQ(binding->counterFiles.size(), 3U);
-  EXPECT_EQ(binding->counterFiles[0].path, "/a/{group}/x{subgroup}y/{name}-*");
-  EXPECT_EQ(binding->counterFiles[0].key, std::nullopt);
-  EXPECT_EQ(binding->counterFiles[1].group, "g");
-  EXPECT_EQ(binding->counterFiles[1].subgroup, "s");
-  EXPECT_EQ(binding->counterFiles[1].name, std::nullopt);
-  EXPECT_EQ(binding->counterFiles[1].key, "{name}");
-  EXPECT_EQ(binding->counterFiles[2].name, "n");
-  EXPECT_EQ(binding->counterFiles[2].key, "k");
-  ASSERT_EQ(binding->tracepoints.size(), 2U);
-  EXPECT_EQ(binding->tracepoints[0].system, "v4l2");
-  EXPECT_EQ(binding->tracepoints[0].event, "*");
-  EXPECT_EQ(binding->tracepoints[0].group, std::nullopt);
-  EXPECT_EQ(binding->tracepoints[1].group, "g");
-  EXPECT_EQ(binding->tracepoints[1].subgroup, "s");
-  EXPECT_EQ(binding->tracepoints[1].name, "n");
-  ASSERT_TRUE(binding->display);
-  EXPECT_EQ(binding->display->connector, "DSI-1");
+  ASSERT_EQ(binding.counterFiles.size(), 3U);
+  EXPECT_EQ(binding.counterFiles[0].path, "/a/{group}/x{subgroup}y/{name}-*");
+  EXPECT_EQ(binding.counterFiles[0].key, std::nullopt);
+  EXPECT_EQ(binding.counterFiles[1].group, "g");
+  EXPECT_EQ(binding.counterFiles[1].subgroup, "s");
+  EXPECT_EQ(binding.counterFiles[1].name, std::nullopt);
+  EXPECT_EQ(binding.counterFiles[1].key, "{name}");
+  EXPECT_EQ(binding.counterFiles[2].name, "n");
+  EXPECT_EQ(binding.counterFiles[2].key, "k");
+  ASSERT_EQ(binding.tracepoints.size(), 2U);
+  EXPECT_EQ(binding.tracepoints[0].system, "v4l2");
+  EXPECT_EQ(binding.tracepoints[0].event, "*");
+  EXPECT_EQ(binding.tracepoints[0].group, std::nullopt);
+  EXPECT_EQ(binding.tracepoints[1].group, "g");
+  EXPECT_EQ(binding.tracepoints[1].subgroup, "s");
+  EXPECT_EQ(binding.tracepoints[1].name, "n");
+  ASSERT_TRUE(binding.display);
+  EXPECT_EQ(binding.display->connector, "DSI-1");
 }
 
 TEST_F(BindingTest, ATitleIsEnough) {
-  const std::optional<Binding> binding = read(R"({"title": "t"})");
-  ASSERT_TRUE(binding);
-  EXPECT_THAT(binding->cameras, IsEmpty());
-  EXPECT_FALSE(binding->display);
+  const Binding binding = read(R"({"title": "t"})");
+  EXPECT_THAT(binding.cameras, IsEmpty());
+  EXPECT_FALSE(binding.display);
 }
 
 struct Refused {
@@ -387,18 +390,15 @@ TEST_F(BindingTest, RefusesWhatIsNoBinding) {
        "F:2: the document: there is no key \"camera\"; did you mean \"cameras\"?"},
   };
   for (const Refused& row : kRows) EXPECT_THAT(problemOf(row.text), ::testing::StartsWith(row.problem)) << row.what;
-  std::string problem;
-  EXPECT_FALSE(readBinding("nowhere.json", &problem));
-  EXPECT_EQ(problem, "nowhere.json: there is no such file.");
-  EXPECT_FALSE(readBinding("nowhere.json", nullptr));
+  EXPECT_THAT([] { readBinding("nowhere.json"); },
+              ::testing::ThrowsMessage<InputError>("nowhere.json: there is no such file."));
 }
 
 TEST(Bindings, ThatAreInstalledCanBeRead) {
   std::size_t count = 0;
   for (const auto& entry : fs::directory_iterator(QUAZOR_BINDING_FOLDER)) {
     if (entry.path().filename() == "binding.schema.json") continue;
-    std::string problem;
-    EXPECT_TRUE(readBinding(entry.path(), &problem)) << problem;
+    EXPECT_NO_THROW(readBinding(entry.path())) << entry.path();
     ++count;
   }
   EXPECT_EQ(count, 2U);

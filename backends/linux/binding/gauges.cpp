@@ -69,7 +69,7 @@ struct ParsedRule {
 std::vector<ParsedRule> parsedRules() {
   std::vector<ParsedRule> rules;
   for (const Rule& rule : kRules) {
-    rules.push_back({*NamePattern::parse(rule.file, nullptr), *NamePattern::parse(rule.key, nullptr), rule.reason});
+    rules.push_back({NamePattern::parse(rule.file), NamePattern::parse(rule.key), rule.reason});
   }
   return rules;
 }

@@ -1,5 +1,7 @@
 #include "backends/linux/binding/name_pattern.h"
 
+#include "base/text/input_error.h"
+
 #include <algorithm>
 #include <array>
 #include <utility>
@@ -20,14 +22,9 @@ const Placeholder* placeholderNamed(std::string_view name) {
   return found == kPlaceholders.end() ? nullptr : &*found;
 }
 
-std::nullopt_t refuse(std::string* problem, std::string text) {
-  if (problem != nullptr) *problem = std::move(text);
-  return std::nullopt;
-}
-
 }  // namespace
 
-std::optional<NamePattern> NamePattern::parse(std::string_view text, std::string* problem) {
+NamePattern NamePattern::parse(std::string_view text) {
   NamePattern pattern;
   for (std::size_t at = 0; at < text.size();) {
     std::string& literal = pattern.wildcards_.empty() ? pattern.beginning_ : pattern.wildcards_.back().after;
@@ -41,19 +38,19 @@ std::optional<NamePattern> NamePattern::parse(std::string_view text, std::string
     std::string placeholder;
     if (character != '*') {
       const std::size_t end = character == '{' ? text.find('}', at) : std::string_view::npos;
-      if (end == std::string_view::npos) return refuse(problem, "holds a brace without its other one.");
+      if (end == std::string_view::npos) throw InputError("holds a brace without its other one.");
       placeholder = text.substr(at + 1, end - at - 1);
       length = placeholder.size() + 2;
       if (placeholderNamed(placeholder) == nullptr) {
-        return refuse(problem, "holds the unknown placeholder \"{" + placeholder +
-                                   "}\"; known are \"{group}\", \"{subgroup}\" and \"{name}\".");
+        throw InputError("holds the unknown placeholder \"{" + placeholder +
+                         "}\"; known are \"{group}\", \"{subgroup}\" and \"{name}\".");
       }
       if (pattern.hasPlaceholder(placeholder)) {
-        return refuse(problem, "holds the placeholder \"{" + placeholder + "}\" twice; leave one.");
+        throw InputError("holds the placeholder \"{" + placeholder + "}\" twice; leave one.");
       }
     }
     if (!pattern.wildcards_.empty() && literal.empty()) {
-      return refuse(problem, "has nothing between two parts that stand for any text; where one ends cannot be known.");
+      throw InputError("has nothing between two parts that stand for any text; where one ends cannot be known.");
     }
     pattern.wildcards_.push_back({std::move(placeholder), {}});
     at += length;

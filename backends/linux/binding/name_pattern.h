@@ -22,9 +22,9 @@ struct ChannelNames {
 // Thread: any; it is immutable.
 class NamePattern {
  public:
-  // Nothing when the text is no pattern; then `problem`, where given, is what is wrong with it, as the end of a
-  // sentence: "holds the unknown placeholder \"{nmae}\"; ...".
-  static std::optional<NamePattern> parse(std::string_view text, std::string* problem);
+  // Throws InputError when the text is not a pattern; what() is the end of a sentence: "holds the unknown placeholder
+  // \"{nmae}\"; ...".
+  static NamePattern parse(std::string_view text);
 
   // Nothing of it stands for any text.
   bool isLiteral() const { return wildcards_.empty(); }

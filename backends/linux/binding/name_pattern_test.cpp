@@ -1,5 +1,8 @@
 #include "backends/linux/binding/name_pattern.h"
 
+#include "base/text/input_error.h"
+
+#include <gmock/gmock.h>
 #include <gtest/gtest.h>
 
 #include <string>
@@ -9,12 +12,10 @@ namespace {
 
 // "group|subgroup|name" of what the placeholders stood for, "-" for none; "no" when the name does not match.
 std::string matched(std::string_view pattern, std::string_view name) {
-  std::string problem;
-  const std::optional<NamePattern> parsed = NamePattern::parse(pattern, &problem);
-  if (!parsed) return problem;
+  const NamePattern parsed = NamePattern::parse(pattern);
   ChannelNames names;
-  const bool matches = parsed->match(name, &names);
-  EXPECT_EQ(parsed->matches(name), matches) << pattern << " " << name;
+  const bool matches = parsed.match(name, &names);
+  EXPECT_EQ(parsed.matches(name), matches) << pattern << " " << name;
   if (!matches) return "no";
   return names.group.value_or("-") + "|" + names.subgroup.value_or("-") + "|" + names.name.value_or("-");
 }
@@ -59,26 +60,35 @@ TEST(NamePattern, TellsWhatThePlaceholdersStoodFor) {
 TEST(NamePattern, LeavesTheNamesWhereNothingMatches) {
   ChannelNames names;
   names.group = "before";
-  EXPECT_FALSE(NamePattern::parse("{group}-{name}b", nullptr)->match("a-c", &names));
+  EXPECT_FALSE(NamePattern::parse("{group}-{name}b").match("a-c", &names));
   EXPECT_EQ(names.group, "before");
 }
 
 TEST(NamePattern, KnowsItsPlaceholders) {
-  const NamePattern pattern = *NamePattern::parse("a*b{name}", nullptr);
+  const NamePattern pattern = NamePattern::parse("a*b{name}");
   EXPECT_TRUE(pattern.hasPlaceholder("name"));
   EXPECT_FALSE(pattern.hasPlaceholder("group"));
   EXPECT_FALSE(pattern.isLiteral());
-  EXPECT_TRUE(NamePattern::parse("ab", nullptr)->isLiteral());
+  EXPECT_TRUE(NamePattern::parse("ab").isLiteral());
 }
 
 TEST(NamePattern, RefusesWhatIsNone) {
-  EXPECT_FALSE(NamePattern::parse("{", nullptr));
-  EXPECT_EQ(matched("a{b", ""), "holds a brace without its other one.");
-  EXPECT_EQ(matched("a}b", ""), "holds a brace without its other one.");
-  EXPECT_EQ(matched("**", ""),
-            "has nothing between two parts that stand for any text; where one ends cannot be known.");
-  EXPECT_EQ(matched("{}", ""),
-            "holds the unknown placeholder \"{}\"; known are \"{group}\", \"{subgroup}\" and \"{name}\".");
+  const struct {
+    const char* pattern;
+    const char* problem;
+  } kRows[] = {
+      {"{", "holds a brace without its other one."},
+      {"a{b", "holds a brace without its other one."},
+      {"a}b", "holds a brace without its other one."},
+      {"**", "has nothing between two parts that stand for any text; where one ends cannot be known."},
+      {"{}", "holds the unknown placeholder \"{}\"; known are \"{group}\", \"{subgroup}\" and \"{name}\"."},
+      {"{name}-{name}", "holds the placeholder \"{name}\" twice; leave one."},
+  };
+  for (const auto& row : kRows) {
+    EXPECT_THAT([&] { static_cast<void>(NamePattern::parse(row.pattern)); },
+                testing::ThrowsMessage<InputError>(row.problem))
+        << row.pattern;
+  }
 }
 
 }  // namespace

@@ -32,7 +32,7 @@ class Walk {
     for (std::size_t begin = 1; begin <= path.size();) {
       const std::size_t end = std::min(path.find('/', begin), path.size());
       components_.emplace_back(path.substr(begin, end - begin));
-      patterns_.push_back(*NamePattern::parse(components_.back(), nullptr));  // as the binding's reader checked
+      patterns_.push_back(NamePattern::parse(components_.back()));  // as the binding's reader checked
       begin = end + 1;
     }
   }

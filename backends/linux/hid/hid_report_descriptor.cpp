@@ -1,6 +1,9 @@
 #include "backends/linux/hid/hid_report_descriptor.h"
 
+#include "base/text/input_error.h"
+
 #include <cstddef>
+#include <optional>
 #include <utility>
 
 namespace quazor {
@@ -30,7 +33,7 @@ enum Item : std::uint8_t {
 
 constexpr std::size_t kMaxDepth = 64;  // of collections, and of pushes
 
-// 6.2.2.7: what holds until it is said anew.
+// 6.2.2.7: what holds until it is changed.
 struct GlobalState {
   std::uint16_t usagePage = 0;
   std::uint32_t reportSize = 0;  // of one field, in bits
@@ -50,123 +53,112 @@ class Parser {
  public:
   explicit Parser(std::span<const std::uint8_t> bytes) : bytes_(bytes) {}
 
-  bool parse() {
+  HidReportDescriptor parse() {
     while (at_ < bytes_.size()) {
       begin_ = at_;
-      if (!parseItem()) return false;
+      parseItem();
     }
     begin_ = at_;
-    return depth_ == 0 || damaged("a collection does not end");
-  }
-
-  std::string takeProblem() { return std::move(problem_); }
-
-  HidReportDescriptor takeResult() {
+    if (depth_ != 0) refuse("a collection does not end");
     result_.inputReports = bytesOf(input_);
     result_.featureReports = bytesOf(feature_);
     return std::move(result_);
   }
 
  private:
-  bool damaged(const std::string& what) {
-    problem_ = what + ", at byte " + std::to_string(begin_);
-    return false;
+  [[noreturn]] void refuse(const std::string& what) const {
+    throw InputError(what + ", at byte " + std::to_string(begin_));
   }
 
-  bool parseItem() {
+  void parseItem() {
     const std::uint8_t prefix = bytes_[at_++];
-    if (prefix == kLongItem) return skipLongItem();
+    if (prefix == kLongItem) {
+      skipLongItem();
+      return;
+    }
     const std::size_t size = (prefix & kSize) == 3 ? 4 : prefix & kSize;
-    if (bytes_.size() - at_ < size) return damaged("an item is cut off");
+    if (bytes_.size() - at_ < size) refuse("an item is cut off");
     std::uint32_t data = 0;
     for (std::size_t i = 0; i < size; ++i) data |= static_cast<std::uint32_t>(bytes_[at_ + i]) << (8 * i);
     at_ += size;
-    return take(prefix & kTagAndType, data, size);
+    take(prefix & kTagAndType, data, size);
   }
 
   // No long item is defined.
-  bool skipLongItem() {
+  void skipLongItem() {
     const std::size_t size = at_ < bytes_.size() ? std::size_t{2} + bytes_[at_] : 1;
-    if (bytes_.size() - at_ < size) return damaged("an item is cut off");
+    if (bytes_.size() - at_ < size) refuse("an item is cut off");
     at_ += size;
-    return true;
   }
 
   // All that is not listed changes neither usages nor lengths.
-  bool take(std::uint8_t item, std::uint32_t data, std::size_t size) {
+  void take(std::uint8_t item, std::uint32_t data, std::size_t size) {
     switch (item) {
-      case kInput: return addField(input_);
-      case kFeature: return addField(feature_);
-      case kOutput: return endMainItem();
-      case kCollection: return beginCollection();
-      case kEndCollection: return endCollection();
-      case kUsagePage: global_.usagePage = static_cast<std::uint16_t>(data); return true;
-      case kReportSize: global_.reportSize = data; return true;
-      case kReportCount: global_.reportCount = data; return true;
-      case kReportID: return setReportID(data);
-      case kPush: return push();
-      case kPop: return pop();
+      case kInput: addField(input_); break;
+      case kFeature: addField(feature_); break;
+      case kOutput: endMainItem(); break;
+      case kCollection: beginCollection(); break;
+      case kEndCollection: endCollection(); break;
+      case kUsagePage: global_.usagePage = static_cast<std::uint16_t>(data); break;
+      case kReportSize: global_.reportSize = data; break;
+      case kReportCount: global_.reportCount = data; break;
+      case kReportID: setReportID(data); break;
+      case kPush: push(); break;
+      case kPop: pop(); break;
       case kUsageItem:
-      case kUsageMinimum: return setUsage(data, size);
-      default: return true;
+      case kUsageMinimum: setUsage(data, size); break;
+      default: break;
     }
   }
 
-  bool setReportID(std::uint32_t data) {
-    if (data == 0 || data > 0xFF) return damaged("a report ID is not from 1 to 255");
+  void setReportID(std::uint32_t data) {
+    if (data == 0 || data > 0xFF) refuse("a report ID is not from 1 to 255");
     global_.reportID = static_cast<std::uint8_t>(data);
     result_.numbered = true;
-    return true;
   }
 
-  bool push() {
-    if (pushed_.size() >= kMaxDepth) return damaged("more is pushed than fits");
+  void push() {
+    if (pushed_.size() >= kMaxDepth) refuse("more is pushed than fits");
     pushed_.push_back(global_);
-    return true;
   }
 
-  bool pop() {
-    if (pushed_.empty()) return damaged("more is popped than was pushed");
+  void pop() {
+    if (pushed_.empty()) refuse("more is popped than was pushed");
     global_ = pushed_.back();
     pushed_.pop_back();
-    return true;
   }
 
   // The first usage of a main item is the one that counts. In four bytes it has its page, else the page is the one that
   // holds at the main item.
-  bool setUsage(std::uint32_t data, std::size_t size) {
-    if (local_) return true;
+  void setUsage(std::uint32_t data, std::size_t size) {
+    if (local_) return;
     local_ = LocalUsage{static_cast<std::uint16_t>(data), std::nullopt};
     if (size == 4) local_->page = static_cast<std::uint16_t>(data >> 16U);
-    return true;
   }
 
-  bool endMainItem() {
-    local_.reset();
-    return true;
-  }
+  void endMainItem() { local_.reset(); }
 
-  bool beginCollection() {
-    if (depth_ >= kMaxDepth) return damaged("collections are nested too deeply");
+  void beginCollection() {
+    if (depth_ >= kMaxDepth) refuse("collections are nested too deeply");
     if (depth_ == 0) {
       result_.topLevel.push_back(local_ ? HidUsage{local_->page.value_or(global_.usagePage), local_->usage}
                                         : HidUsage{});
     }
     ++depth_;
-    return endMainItem();
+    endMainItem();
   }
 
-  bool endCollection() {
-    if (depth_ == 0) return damaged("a collection ends that did not begin");
+  void endCollection() {
+    if (depth_ == 0) refuse("a collection ends that did not begin");
     --depth_;
-    return endMainItem();
+    endMainItem();
   }
 
-  bool addField(Bits& reports) {
+  void addField(Bits& reports) {
     std::uint64_t& bits = reports[global_.reportID];
     bits += static_cast<std::uint64_t>(global_.reportSize) * global_.reportCount;
-    if (bits > std::uint64_t{8} * HidReportDescriptor::kMaxReport) return damaged("a report is too long");
-    return endMainItem();
+    if (bits > std::uint64_t{8} * HidReportDescriptor::kMaxReport) refuse("a report is too long");
+    endMainItem();
   }
 
   std::map<std::uint8_t, std::uint32_t> bytesOf(const Bits& reports) const {
@@ -187,16 +179,10 @@ class Parser {
   Bits input_;
   Bits feature_;
   HidReportDescriptor result_;
-  std::string problem_;
 };
 
 }  // namespace
 
-std::optional<HidReportDescriptor> parseHidReportDescriptor(std::span<const std::uint8_t> bytes, std::string* problem) {
-  Parser parser(bytes);
-  if (parser.parse()) return parser.takeResult();
-  *problem = parser.takeProblem();
-  return std::nullopt;
-}
+HidReportDescriptor parseHidReportDescriptor(std::span<const std::uint8_t> bytes) { return Parser(bytes).parse(); }
 
 }  // namespace quazor

@@ -3,9 +3,7 @@
 
 #include <cstdint>
 #include <map>
-#include <optional>
 #include <span>
-#include <string>
 #include <vector>
 
 namespace quazor {
@@ -32,8 +30,8 @@ struct HidReportDescriptor {
   std::map<std::uint8_t, std::uint32_t> featureReports;
 };
 
-// Reads a report descriptor. Nothing when it is damaged; `problem`, which must not be null, then says in a few words
-// what is wrong with it, and where.
-std::optional<HidReportDescriptor> parseHidReportDescriptor(std::span<const std::uint8_t> bytes, std::string* problem);
+// Reads a report descriptor. Throws InputError when it is damaged; what() says in a few words what is wrong, and at
+// which byte.
+HidReportDescriptor parseHidReportDescriptor(std::span<const std::uint8_t> bytes);
 
 }  // namespace quazor

@@ -1,5 +1,7 @@
 #include "backends/linux/hid/hid_report_descriptor.h"
 
+#include "base/text/input_error.h"
+
 #include "contract/value.h"
 
 #include <gmock/gmock.h>
@@ -28,17 +30,16 @@ const Bytes kMouse = {0x05, 0x01, 0x09, 0x02, 0xA1, 0x01, 0x09, 0x01, 0xA1, 0x00
                       0x95, 0x01, 0x75, 0x05, 0x81, 0x01, 0x05, 0x01, 0x09, 0x30, 0x09, 0x31, 0x15,
                       0x81, 0x25, 0x7F, 0x75, 0x08, 0x95, 0x02, 0x81, 0x06, 0xC0, 0xC0};
 
-HidReportDescriptor parsed(const Bytes& bytes) {
-  std::string problem;
-  const auto descriptor = parseHidReportDescriptor(bytes, &problem);
-  EXPECT_TRUE(descriptor.has_value()) << problem;
-  return descriptor.value_or(HidReportDescriptor{});
-}
+HidReportDescriptor parsed(const Bytes& bytes) { return parseHidReportDescriptor(bytes); }
 
+// Empty when it was read.
 std::string problemOf(const Bytes& bytes) {
-  std::string problem;
-  EXPECT_FALSE(parseHidReportDescriptor(bytes, &problem).has_value());
-  return problem;
+  try {
+    parseHidReportDescriptor(bytes);
+  } catch (const InputError& problem) {
+    return problem.what();
+  }
+  return {};
 }
 
 Bytes repeated(const Bytes& item, std::size_t times) {
@@ -141,9 +142,8 @@ TEST(HidReportDescriptorTest, EveryBeginningOfADescriptorIsReadOrRefused) {
   for (std::size_t length = 0; length <= kSensor.size(); ++length) {
     Bytes bytes(kSensor.begin(), kSensor.begin() + static_cast<std::ptrdiff_t>(length));
     bytes.shrink_to_fit();  // nothing may be read behind it
-    std::string problem;
-    const bool isRead = parseHidReportDescriptor(bytes, &problem).has_value();
-    EXPECT_NE(isRead, !problem.empty()) << length;
+    const bool isWhole = length == 0 || length == kSensor.size();
+    EXPECT_EQ(problemOf(bytes).empty(), isWhole) << length;
   }
 }
 

@@ -1,5 +1,7 @@
 #include "backends/linux/hid/hidraw_nodes.h"
 
+#include "base/text/input_error.h"
+
 #include <fcntl.h>
 #include <unistd.h>
 
@@ -67,7 +69,11 @@ std::optional<HidrawNode> nodeOf(const HidrawRoots& roots, const std::string& na
   if (!descriptor) return std::nullopt;
   node.rawDescriptor = *std::move(descriptor);
   node.name = nameFrom(node.device / "uevent");
-  if (auto parsed = parseHidReportDescriptor(node.rawDescriptor, &node.problem)) node.descriptor = *std::move(parsed);
+  try {
+    node.descriptor = parseHidReportDescriptor(node.rawDescriptor);
+  } catch (const InputError& problem) {
+    node.problem = problem.what();
+  }
   node.noAccess = reasonOfNoAccess(node.path);
   return node;
 }

@@ -5,10 +5,10 @@
 #include "backends/linux/display/display_connectors.h"
 #include "backends/linux/probe/probe_cameras.h"
 #include "backends/linux/system/linux_error.h"
+#include "base/text/hexadecimal.h"
 #include "contract/message_format.h"
 
 #include <algorithm>
-#include <cstdio>
 #include <optional>
 #include <string_view>
 #include <utility>
@@ -17,12 +17,6 @@ namespace quazor {
 namespace {
 
 using Json = nlohmann::ordered_json;
-
-std::string hexText(unsigned number, int digits) {
-  char text[16];
-  std::snprintf(text, sizeof text, "0x%0*X", digits, number);
-  return text;
-}
 
 // What many machines count, as entries of a binding.
 std::vector<CounterFilesBinding> usualCounterFiles() {
@@ -89,7 +83,7 @@ class Probe {
     for (const HidrawNode& node : nodes) {
       tell("  " + node.path.string() + (node.name.empty() ? "" : " (" + node.name + ")"));
       for (const HidUsage& usage : node.descriptor.topLevel) {
-        tell("    usage page " + hexText(usage.page, 4) + ", usage " + hexText(usage.usage, 4));
+        tell("    usage page " + hexadecimalNumber(usage.page, 4) + ", usage " + hexadecimalNumber(usage.usage, 4));
       }
       tellReports("input", node.descriptor.inputReports);
       tellReports("feature", node.descriptor.featureReports);
@@ -104,7 +98,7 @@ class Probe {
   void tellReports(std::string_view kind, const std::map<std::uint8_t, std::uint32_t>& reports) {
     std::string text;
     for (const auto& [id, length] : reports) {
-      text += (text.empty() ? "" : ", ") + hexText(id, 2) + formatMessage(" (%@ bytes)", length);
+      text += (text.empty() ? "" : ", ") + hexadecimalNumber(id, 2) + formatMessage(" (%@ bytes)", length);
     }
     if (!text.empty()) tell("    " + std::string(kind) + " reports " + text);
   }

@@ -90,9 +90,9 @@ struct Scenario {
   OrderedMap<Expectation> expectations;  // by the diagnostic's name, or any name of a run of an experiment
 };
 
-// Reads a scenario file and the files it is based on. On failure nothing, and in *problem, unless `problem` is null,
-// one sentence without a line end: the file, the line of a syntax error or the JSON path of a wrong value, what is
-// wrong and what would be right. Any thread.
-std::optional<Scenario> readScenario(const std::filesystem::path& file, std::string* problem);
+// Reads a scenario file and the files it is based on. Throws InputError, one sentence without a line end: the
+// file, the line where it is the file's own, the JSON path of a wrong value, what is wrong and what would be right. Any
+// thread.
+Scenario readScenario(const std::filesystem::path& file);
 
 }  // namespace quazor

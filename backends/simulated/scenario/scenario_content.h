@@ -6,7 +6,7 @@
 
 namespace quazor {
 
-// The scenario that a document describes, its "base" already merged in. Throws JsonProblem, "PATH: ...".
+// The scenario that a document describes, its "base" already merged in. Throws InputError, "PATH: ...".
 Scenario scenarioOf(const JsonCursor& document);
 
 }  // namespace quazor

@@ -1,5 +1,7 @@
 #include "backends/simulated/scenario/scenario_content.h"
 
+#include "base/text/input_error.h"
+
 #include <gmock/gmock.h>
 #include <gtest/gtest.h>
 
@@ -35,7 +37,7 @@ Scenario read(const std::string& text) {
 std::string problemOf(const std::string& text) {
   try {
     read(text);
-  } catch (const JsonProblem& problem) {
+  } catch (const InputError& problem) {
     return problem.what();
   }
   return "nothing";

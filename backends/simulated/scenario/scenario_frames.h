@@ -9,7 +9,7 @@
 
 namespace quazor {
 
-// All throw JsonProblem, "PATH: ...".
+// All throw InputError, "PATH: ...".
 Projector readProjector(const JsonCursor& cursor);
 DeliveryConfig readDelivery(const JsonCursor& cursor);
 // Errors per second of streaming, by counter; unsigned integers.

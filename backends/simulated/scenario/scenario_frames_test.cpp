@@ -1,5 +1,7 @@
 #include "backends/simulated/scenario/scenario_frames.h"
 
+#include "base/text/input_error.h"
+
 #include <gmock/gmock.h>
 #include <gtest/gtest.h>
 
@@ -130,7 +132,7 @@ TEST(ScenarioFramesTest, WhatIsWrongIsToldInOneSentence) {
     try {
       row.read(JsonCursor(document));
       ADD_FAILURE() << row.text << " was read";
-    } catch (const JsonProblem& problem) {
+    } catch (const InputError& problem) {
       EXPECT_STREQ(problem.what(), row.problem) << row.text;
     }
   }

@@ -9,7 +9,7 @@
 namespace quazor {
 
 // The key of an entry that is a number from 0 to `highest`; `what` says of what: "a frame". `entry` is its value.
-// Throws JsonProblem, "PATH: ...".
+// Throws InputError, "PATH: ...".
 std::uint64_t readNumberKey(const std::string& key, const std::string& what, std::uint64_t highest,
                             const JsonCursor& entry);
 

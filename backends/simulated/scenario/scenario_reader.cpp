@@ -1,7 +1,9 @@
 #include "backends/simulated/scenario/scenario.h"
 #include "backends/simulated/scenario/scenario_content.h"
+#include "base/text/input_error.h"
 
 #include <algorithm>
+#include <system_error>
 #include <utility>
 #include <vector>
 
@@ -18,40 +20,46 @@ struct Loaded {
 
 // One file and its bases. A base is a whole scenario itself, so that what is wrong with it is found there and not in
 // the files that build on it. `open_` are the files on the way here; none of them may be a base again.
+//
+// Thread: one at a time
 class Loader {
  public:
   Loaded load(const fs::path& file) {
-    Json document = readJsonFile(file);
-    try {
-      if (document.is_object() && document.contains("base")) document = merged(std::move(document), file);
-      Scenario scenario = scenarioOf(JsonCursor(document));
-      return {std::move(document), std::move(scenario)};
-    } catch (const JsonProblem& problem) {
-      throw JsonProblem(file.string() + ": " + problem.what());
-    }
+    JsonDocument document = JsonDocument::read(file);
+    if (document.value().is_object() && document.value().contains("base")) document.setValue(merged(document, file));
+    Scenario scenario = scenarioOf(JsonCursor(document));
+    return {document.value(), std::move(scenario)};
   }
 
  private:
   // RFC 7396: the document as a merge patch on its base.
-  Json merged(Json document, const fs::path& file) {
+  Json merged(const JsonDocument& document, const fs::path& file) {
     const JsonCursor base = JsonCursor(document).at("base");
     const fs::path baseFile = (file.parent_path() / base.text()).lexically_normal();
-    open_.push_back(fs::weakly_canonical(file));
-    if (std::ranges::find(open_, fs::weakly_canonical(baseFile)) != open_.end()) {
+    open_.push_back(canonical(file));
+    if (std::ranges::find(open_, canonical(baseFile)) != open_.end()) {
       base.fail(inQuotes(base.text()) + " is based on this file in turn; a base must stand on its own.");
     }
-    Json result = loadBase(baseFile);
-    document.erase("base");
-    result.merge_patch(document);
+    Json patch = document.value();
+    patch.erase("base");
+    Json result = loadBase(baseFile, base);
+    result.merge_patch(patch);
     return result;
   }
 
-  Json loadBase(const fs::path& file) {
+  Json loadBase(const fs::path& file, const JsonCursor& base) {
     try {
       return load(file).document;
-    } catch (const JsonProblem& problem) {
-      throw JsonProblem(std::string("base: ") + problem.what());
+    } catch (const InputError& problem) {
+      base.fail(problem.what());
     }
+  }
+
+  static fs::path canonical(const fs::path& file) {
+    std::error_code failure;
+    fs::path path = fs::weakly_canonical(file, failure);
+    if (failure) throw InputError(file.string() + ": " + failure.message() + ".");
+    return path;
   }
 
   std::vector<fs::path> open_;
@@ -59,15 +67,6 @@ class Loader {
 
 }  // namespace
 
-std::optional<Scenario> readScenario(const fs::path& file, std::string* problem) {
-  try {
-    return Loader().load(file).scenario;
-  } catch (const JsonProblem& found) {
-    if (problem != nullptr) *problem = found.what();
-  } catch (const fs::filesystem_error& failure) {
-    if (problem != nullptr) *problem = file.string() + ": " + failure.code().message() + ".";
-  }
-  return std::nullopt;
-}
+Scenario readScenario(const fs::path& file) { return Loader().load(file).scenario; }
 
 }  // namespace quazor

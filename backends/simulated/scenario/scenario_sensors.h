@@ -9,7 +9,7 @@
 
 namespace quazor {
 
-// Both throw JsonProblem, "PATH: ...".
+// Both throw InputError, "PATH: ...".
 HidDeviceConfig readHidDevice(const std::string& name, const JsonCursor& cursor);
 DisplayConfig readDisplay(const JsonCursor& cursor);
 

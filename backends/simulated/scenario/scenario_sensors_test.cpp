@@ -1,5 +1,7 @@
 #include "backends/simulated/scenario/scenario_sensors.h"
 
+#include "base/text/input_error.h"
+
 #include <gmock/gmock.h>
 #include <gtest/gtest.h>
 
@@ -27,7 +29,7 @@ DisplayConfig readDisplayText(std::string_view text) {
 std::string problemOf(const std::function<void()>& read) {
   try {
     read();
-  } catch (const JsonProblem& problem) {
+  } catch (const InputError& problem) {
     return problem.what();
   }
   return "nothing";

@@ -1,4 +1,6 @@
-#include "base/json/json_file.h"
+#include "base/json/json_document.h"
+
+#include "base/text/input_error.h"
 
 #include <gmock/gmock.h>
 #include <gtest/gtest.h>
@@ -37,21 +39,26 @@ TEST(LineOfPath, IsWhereTheKeyOrTheElementStands) {
                {"list[2].second[1][0]", 9},
                {"list[3]", 10},
                {"last", 12},
-               {"", 1},
-               {"nowhere", 1}};
+               {"", 1}};
   for (const auto& row : kRows) EXPECT_EQ(lineOfPath(kDocument, row.path), row.line) << row.path;
+  EXPECT_EQ(lineOfPath(kDocument, "nowhere"), std::nullopt);
 }
 
-std::string problemOf(std::string_view text) {
+template <class Call>
+std::string problemOfCall(const Call& call) {
   try {
-    parseJson(text, "a.json");
-  } catch (const JsonProblem& problem) {
+    call();
+  } catch (const InputError& problem) {
     return problem.what();
   }
   return "nothing";
 }
 
-TEST(ParseJson, TellsTheLineOfWhatIsWrong) {
+std::string problemOf(const std::string& text) {
+  return problemOfCall([&] { JsonDocument(text, "a.json"); });
+}
+
+TEST(JsonDocument, TellsTheLineOfWhatIsWrong) {
   EXPECT_EQ(problemOf("{\n\"a\": 1,\n\"a\": 2}"), "a.json:3: the key \"a\" stands twice; leave one of the two.");
   EXPECT_EQ(problemOf("{\"b\": [\n{\"a\": 1,\n\"a\": 2}]}"),
             "a.json:3: b[0]: the key \"a\" stands twice; leave one of the two.");
@@ -61,28 +68,30 @@ TEST(ParseJson, TellsTheLineOfWhatIsWrong) {
   EXPECT_EQ(problemOf("\n\xff"), "a.json:2: this is not UTF-8; save the file in that encoding.");
 }
 
-TEST(ReadTextFile, SaysWhyAFileCannotBeRead) {
-  const auto problemWith = [](const char* file) -> std::string {
-    try {
-      return "read: " + readTextFile(file);
-    } catch (const JsonProblem& problem) {
-      return problem.what();
-    }
+TEST(JsonDocument, SaysWhyAFileCannotBeRead) {
+  const auto problemWith = [](const char* file) {
+    return problemOfCall([file] { static_cast<void>(JsonDocument::read(file)); });
   };
-  EXPECT_EQ(problemWith("/dev/null"), "read: ");
+  EXPECT_THAT(problemWith("/dev/null"), testing::StartsWith("/dev/null:1: this is not JSON: "));
   EXPECT_EQ(problemWith("/proc/self/mem"), "/proc/self/mem: the file cannot be read.");
   EXPECT_EQ(problemWith("/dev/zero"), "/dev/zero: the file is larger than 16 MiB.");
   EXPECT_EQ(problemWith("/proc"), "/proc: this is a directory, not a file.");
   EXPECT_EQ(problemWith("/proc/nothing"), "/proc/nothing: there is no such file.");
 }
 
-TEST(JsonProblem, KnowsThePlaceThatItIsAbout) {
-  EXPECT_EQ(JsonProblem("sentence").place(), std::nullopt);
-  EXPECT_EQ(JsonProblem("a[1]", "sentence").place(), "a[1]");
-  EXPECT_STREQ(JsonProblem("a[1]", "sentence").what(), "a[1]: sentence");
-  EXPECT_STREQ(JsonProblem("", "sentence").what(), "the document: sentence");
-  EXPECT_STREQ(JsonProblem("a", "sentence", "a.b").what(), "a: sentence");
-  EXPECT_EQ(JsonProblem("a", "sentence", "a.b").place(), "a.b");
+TEST(JsonDocument, NamesTheLineWhereThePlaceIsInTheText) {
+  JsonDocument document("{\n\"a\": 1}", "a.json");
+  const auto problemAt = [&document](const std::string& path, const std::string& place) {
+    return problemOfCall([&] { document.fail(path, "sentence.", place); });
+  };
+  EXPECT_EQ(problemAt("a", "a"), "a.json:2: a: sentence.");
+  EXPECT_EQ(problemAt("", ""), "a.json:1: the document: sentence.");
+  EXPECT_EQ(problemAt("", "a"), "a.json:2: the document: sentence.");
+  EXPECT_EQ(problemAt("b", "b"), "a.json: b: sentence.");
+  document.setValue({{"b", 2}});
+  EXPECT_EQ(document.value().dump(), R"({"b":2})");
+  EXPECT_EQ(problemAt("a", "a"), "a.json:2: a: sentence.");
+  EXPECT_EQ(problemAt("b", "b"), "a.json: b: sentence.");
 }
 
 }  // namespace

@@ -1,4 +1,7 @@
-#include "base/json/json_file.h"
+#include "base/json/json_document.h"
+
+#include "base/text/input_error.h"
+#include "base/text/utf8.h"
 
 #include <algorithm>
 #include <array>
@@ -17,37 +20,8 @@ namespace {
 using Json = nlohmann::ordered_json;
 
 constexpr std::size_t kMaxFile = 16U << 20;  // a device may have no end
-// Deeper than any document. Bounds the recursion of whoever walks the document.
+// Deeper than any document. Bounds the recursion of those who walk the document.
 constexpr std::size_t kMaxDepth = 32;
-
-// The length of the UTF-8 sequence at the start of `text`; 0 when it is none (RFC 3629).
-std::size_t sequenceLength(std::string_view text) {
-  const auto at = [&](std::size_t i) { return i < text.size() ? static_cast<unsigned char>(text[i]) : 0U; };
-  const auto continues = [&](std::size_t i) { return (at(i) & 0xC0U) == 0x80U; };
-  const unsigned first = at(0);
-  if (first < 0x80) return 1;
-  if (first >= 0xC2 && first <= 0xDF) return continues(1) ? 2 : 0;
-  if (first >= 0xE0 && first <= 0xEF) {
-    const bool overlong = first == 0xE0 && at(1) < 0xA0;
-    const bool surrogate = first == 0xED && at(1) > 0x9F;
-    return continues(1) && continues(2) && !overlong && !surrogate ? 3 : 0;
-  }
-  if (first >= 0xF0 && first <= 0xF4) {
-    const bool overlong = first == 0xF0 && at(1) < 0x90;
-    const bool beyond = first == 0xF4 && at(1) > 0x8F;
-    return continues(1) && continues(2) && continues(3) && !overlong && !beyond ? 4 : 0;
-  }
-  return 0;
-}
-
-std::optional<std::size_t> firstInvalidUtf8(std::string_view text) {
-  for (std::size_t at = 0; at < text.size();) {
-    const std::size_t length = sequenceLength(text.substr(at));
-    if (length == 0) return at;
-    at += length;
-  }
-  return std::nullopt;
-}
 
 std::string lineAt(std::string_view text, std::size_t offset) {
   const std::string_view before = text.substr(0, offset);
@@ -142,8 +116,8 @@ class Tracker {
   void open(bool isArray) {
     element();
     if (open_.size() == kMaxDepth) {
-      throw JsonProblem(name_ + ":" + std::to_string(line()) + ": the document is nested more than " +
-                        std::to_string(kMaxDepth) + " deep.");
+      throw InputError(name_ + ":" + std::to_string(line()) + ": the document is nested more than " +
+                       std::to_string(kMaxDepth) + " deep.");
     }
     open_.push_back({isArray, 0, {}, {}});
   }
@@ -151,7 +125,7 @@ class Tracker {
     Container& object = open_.back();
     object.key.clear();
     if (!object.keys.insert(key).second) {
-      throw JsonProblem(place() + "the key " + Json(key).dump() + " stands twice; leave one of the two.");
+      throw InputError(place() + "the key " + Json(key).dump() + " stands twice; leave one of the two.");
     }
     object.key = key;
   }
@@ -168,6 +142,39 @@ std::string complaintOf(const Json::parse_error& error) {
   return dash == std::string::npos ? text : text.substr(dash + 3);
 }
 
+Json parsed(std::string_view text, const std::string& name) {
+  if (const std::optional<std::size_t> invalid = findInvalidUtf8(text)) {
+    throw InputError(name + ":" + lineAt(text, *invalid) + ": this is not UTF-8; save the file in that encoding.");
+  }
+  Tracker tracker(name);
+  try {
+    return tracker.parse(text, [] {});
+  } catch (const Json::parse_error& error) {
+    const std::size_t offset = error.byte == 0 ? 0 : error.byte - 1;
+    throw InputError(name + ":" + lineAt(text, offset) + ": this is not JSON: " + complaintOf(error) + ".");
+  } catch (const Json::out_of_range&) {
+    throw InputError(tracker.place() + "the number is too large; a double must hold it.");
+  }
+}
+
+std::string textOf(const std::filesystem::path& file) {
+  const std::string name = file.string();
+  std::error_code failure;
+  const std::filesystem::file_status status = std::filesystem::status(file, failure);
+  if (status.type() == std::filesystem::file_type::not_found) throw InputError(name + ": there is no such file.");
+  if (std::filesystem::is_directory(status)) throw InputError(name + ": this is a directory, not a file.");
+  std::ifstream stream(file, std::ios::binary);
+  if (!stream) throw InputError(name + ": the file cannot be opened; check its permissions.");
+  std::string text;
+  std::array<char, 65536> piece;  // read() notes a failure where iterators throw
+  while (stream.read(piece.data(), piece.size()) || stream.gcount() > 0) {
+    text.append(piece.data(), static_cast<std::size_t>(stream.gcount()));
+    if (text.size() > kMaxFile) throw InputError(name + ": the file is larger than 16 MiB.");
+  }
+  if (stream.bad()) throw InputError(name + ": the file cannot be read.");
+  return text;
+}
+
 }  // namespace
 
 std::string jsonPath(const std::string& path, std::string_view key) {
@@ -176,48 +183,28 @@ std::string jsonPath(const std::string& path, std::string_view key) {
 
 std::string jsonPath(const std::string& path, std::size_t index) { return path + "[" + std::to_string(index) + "]"; }
 
-Json parseJson(std::string_view text, const std::string& name) {
-  if (const std::optional<std::size_t> invalid = firstInvalidUtf8(text)) {
-    throw JsonProblem(name + ":" + lineAt(text, *invalid) + ": this is not UTF-8; save the file in that encoding.");
-  }
-  Tracker tracker(name);
-  try {
-    return tracker.parse(text, [] {});
-  } catch (const Json::parse_error& error) {
-    const std::size_t offset = error.byte == 0 ? 0 : error.byte - 1;
-    throw JsonProblem(name + ":" + lineAt(text, offset) + ": this is not JSON: " + complaintOf(error) + ".");
-  } catch (const Json::out_of_range&) {
-    throw JsonProblem(tracker.place() + "the number is too large; a double must hold it.");
-  }
+std::string sentenceAbout(const std::string& path, const std::string& sentence) {
+  return (path.empty() ? "the document" : path) + ": " + sentence;
 }
 
-std::size_t lineOfPath(std::string_view text, const std::string& path) {
+std::optional<std::size_t> lineOfPath(std::string_view text, const std::string& path) {
+  if (path.empty()) return 1;
   Tracker tracker("");
-  std::size_t line = 0;
+  std::optional<std::size_t> line;
   tracker.parse(text, [&] {
-    if (line == 0 && tracker.path() == path) line = tracker.line();
+    if (!line && tracker.path() == path) line = tracker.line();
   });
-  return std::max(line, std::size_t{1});
+  return line;
 }
 
-std::string readTextFile(const std::filesystem::path& file) {
-  const std::string name = file.string();
-  std::error_code failure;
-  const std::filesystem::file_status status = std::filesystem::status(file, failure);
-  if (status.type() == std::filesystem::file_type::not_found) throw JsonProblem(name + ": there is no such file.");
-  if (std::filesystem::is_directory(status)) throw JsonProblem(name + ": this is a directory, not a file.");
-  std::ifstream stream(file, std::ios::binary);
-  if (!stream) throw JsonProblem(name + ": the file cannot be opened; check its permissions.");
-  std::string text;
-  std::array<char, 65536> piece;  // read() notes a failure where iterators throw
-  while (stream.read(piece.data(), piece.size()) || stream.gcount() > 0) {
-    text.append(piece.data(), static_cast<std::size_t>(stream.gcount()));
-    if (text.size() > kMaxFile) throw JsonProblem(name + ": the file is larger than 16 MiB.");
-  }
-  if (stream.bad()) throw JsonProblem(name + ": the file cannot be read.");
-  return text;
-}
+JsonDocument::JsonDocument(std::string text, std::string name)
+    : text_(std::move(text)), name_(std::move(name)), value_(parsed(text_, name_)) {}
 
-Json readJsonFile(const std::filesystem::path& file) { return parseJson(readTextFile(file), file.string()); }
+JsonDocument JsonDocument::read(const std::filesystem::path& file) { return {textOf(file), file.string()}; }
+
+void JsonDocument::fail(const std::string& path, const std::string& sentence, const std::string& place) const {
+  const std::optional<std::size_t> line = lineOfPath(text_, place);
+  throw InputError(name_ + (line ? ":" + std::to_string(*line) : "") + ": " + sentenceAbout(path, sentence));
+}
 
 }  // namespace quazor
