@@ -1,5 +1,6 @@
 #include "backends/faults/fault_reader.h"
 
+#include "backends/capture/property_table.h"
 #include "backends/faults/hid_report_name.h"
 #include "backends/faults/operations.h"
 
@@ -20,50 +21,54 @@ constexpr std::string_view kEveryOperation = "*";
 // What one selector may name: with one operation, or with all together.
 struct Selectable {
   Names names;
-  bool any = false;  // every name
+  bool any = false;        // every name
+  bool anyReport = false;  // the ID of every feature report
 
   void add(const std::vector<std::string>& more) {
-    for (const std::string& name : more) {
-      if (std::ranges::find(names, name) == names.end()) names.push_back(name);
-    }
+    for (const std::string& name : more) addName(name);
   }
-  void add(const std::optional<std::vector<std::string>>& more) {
+  void addKeys(CaptureObjectKind kind) {
+    for (const CaptureProperty& property : propertiesOf(kind)) addName(property.key);
+  }
+  // Where there is no list, `open` becomes true.
+  void add(const std::optional<std::vector<std::string>>& more, bool& open) {
     if (more) add(*more);
-    any = any || !more;
+    open = open || !more;
   }
-  bool isEmpty() const { return names.empty() && !any; }
+  bool isEmpty() const { return names.empty() && !any && !anyReport; }
+
+ private:
+  void addName(std::string_view name) {
+    if (std::ranges::find(names, name) == names.end()) names.push_back(name);
+  }
 };
 
-Selectable objectsOf(const Names& operations, const FaultTargets& targets) {
+Selectable selectableObjects(const Names& operations, const FaultTargets& targets) {
   Selectable objects;
   for (const std::string_view name : operations) {
     switch (findOperation(name)->object) {
       case OperationObject::kStream: objects.add(targets.streams); break;
       case OperationObject::kGroup: objects.add(targets.groups); break;
-      case OperationObject::kHidDevice: objects.add(targets.hidDevices); break;
+      case OperationObject::kHidDevice: objects.add(targets.hidDevices, objects.any); break;
       case OperationObject::kOnlyOne: break;
     }
   }
   return objects;
 }
 
-Selectable propertiesOf(const Names& operations, const FaultTargets& targets) {
+Selectable selectableProperties(const Names& operations, const FaultTargets& targets) {
   Selectable properties;
   for (const std::string_view name : operations) {
     switch (findOperation(name)->property) {
-      case OperationProperty::kOfDevice: properties.add(targets.deviceProperties); break;
-      case OperationProperty::kOfGroup: properties.add(targets.groupProperties); break;
-      case OperationProperty::kOfStream: properties.add(targets.streamProperties); break;
-      case OperationProperty::kFeatureReport: properties.add(targets.featureReports); break;
-      case OperationProperty::kOfRegistry: properties.add(targets.registryProperties); break;
+      case OperationProperty::kOfDevice: properties.addKeys(CaptureObjectKind::kDevice); break;
+      case OperationProperty::kOfGroup: properties.addKeys(CaptureObjectKind::kGroup); break;
+      case OperationProperty::kOfStream: properties.addKeys(CaptureObjectKind::kStream); break;
+      case OperationProperty::kFeatureReport: properties.add(targets.featureReports, properties.anyReport); break;
+      case OperationProperty::kOfRegistry: properties.add(targets.registryProperties, properties.any); break;
       case OperationProperty::kNone: break;
     }
   }
   return properties;
-}
-
-bool isKnown(const Selectable& selectable, const std::string& name) {
-  return std::ranges::find(selectable.names, name) != selectable.names.end();
 }
 
 std::string readObject(const JsonCursor& cursor, const std::string& operation, const Selectable& objects) {
@@ -75,13 +80,10 @@ std::string readObject(const JsonCursor& cursor, const std::string& operation, c
 
 std::string readProperty(const JsonCursor& cursor, const std::string& operation, const Selectable& properties) {
   if (properties.isEmpty()) cursor.fail(operation + " is about no property; leave it out.");
-  if (!properties.any) return cursor.oneOf(properties.names, "a property of " + operation);
+  if (!properties.any && !properties.anyReport) return cursor.oneOf(properties.names, "a property of " + operation);
   std::string name = cursor.text();
-  if (!isKnown(properties, name) && !hidReportNamed(name)) {
-    cursor.fail(inQuotes(name) + " is not a property of " + operation +
-                "; the ID of a feature report is written with two digits, like \"0x0A\".");
-  }
-  return name;
+  if (properties.any || hidReportNamed(name)) return name;
+  cursor.fail(inQuotes(name) + " is not a feature report's ID; write it with two digits, like \"0x0A\".");
 }
 
 void readSelectors(const JsonCursor& cursor, const FaultTargets& targets, Fault& fault) {
@@ -93,10 +95,10 @@ void readSelectors(const JsonCursor& cursor, const FaultTargets& targets, Fault&
   const Names selected = fault.operation == kEveryOperation ? all : Names{fault.operation};
 
   if (const auto object = cursor.find("object")) {
-    fault.object = readObject(*object, fault.operation, objectsOf(selected, targets));
+    fault.object = readObject(*object, fault.operation, selectableObjects(selected, targets));
   }
   if (const auto property = cursor.find("property")) {
-    fault.property = readProperty(*property, fault.operation, propertiesOf(selected, targets));
+    fault.property = readProperty(*property, fault.operation, selectableProperties(selected, targets));
   }
   if (const auto occurrence = cursor.find("occurrence")) fault.occurrence = occurrence->integer(1, kMaxOccurrence);
 }

@@ -10,17 +10,14 @@
 
 namespace quazor {
 
-// What the faults of a platform may name. A list that is not there takes any name.
+// What the faults of a platform may name. A list that is not there takes any name, that of
+// feature reports any ID.
 struct FaultTargets {
   std::vector<std::string> streams;
   std::vector<std::string> groups;
   std::optional<std::vector<std::string>> hidDevices;
-  // Keys of properties.
-  std::vector<std::string> deviceProperties;
-  std::vector<std::string> groupProperties;
-  std::vector<std::string> streamProperties;
-  std::vector<std::string> registryProperties;
-  std::optional<std::vector<std::string>> featureReports;  // as hidReportName() writes them; not there: any ID
+  std::optional<std::vector<std::string>> registryProperties;
+  std::optional<std::vector<std::string>> featureReports;  // as hidReportName() writes them
 };
 
 // Both throw InputError, "PATH: ...", and are called on any thread.

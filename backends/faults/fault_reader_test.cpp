@@ -19,9 +19,6 @@ FaultTargets smallTargets() {
   targets.streams = {"wide", "tele"};
   targets.groups = {"back"};
   targets.hidDevices = {"near"};
-  targets.deviceProperties = {"MultiCamConfiguration"};
-  targets.groupProperties = {"ActiveStreams"};
-  targets.streamProperties = {"FormatIndex"};
   targets.registryProperties = {"Power"};
   targets.featureReports = {"0xAB"};
   return targets;
@@ -64,23 +61,25 @@ TEST(FaultReader, NamesThatThePlatformDoesNotHaveAreRefused) {
             R"([0].object: "back" is not an object of CaptureStream.start; known are "wide", "tele".)");
   EXPECT_EQ(read(R"([{"operation":"HidDevice.open","object":"far","action":"fail"}])"),
             R"([0].object: "far" is not an object of HidDevice.open; known are "near".)");
-  EXPECT_EQ(read(R"([{"operation":"CaptureStream.setValue","property":"Power","action":"fail"}])"),
-            R"([0].property: "Power" is not a property of CaptureStream.setValue; known are "FormatIndex".)");
+  EXPECT_EQ(read(R"([{"operation":"CaptureDevice.setValue","property":"Power","action":"fail"}])"),
+            R"([0].property: "Power" is not a property of CaptureDevice.setValue; known are "MultiCamConfiguration", )"
+            R"("MulticamSessionStatus".)");
 }
 
 TEST(FaultReader, AListThatIsNotThereTakesAnyName) {
   FaultTargets targets = smallTargets();
   targets.hidDevices.reset();
   targets.featureReports.reset();
+  targets.registryProperties.reset();
   const std::string open =
       R"({"operation":"HidDevice.setFeatureReportWithID","object":"far","property":"0x0C","action":"fail"})";
   EXPECT_EQ(read('[' + open + ']', targets), open);
-  const std::string every = R"({"operation":"*","object":"far","property":"Power","action":"fail"})";
+  const std::string every = R"({"operation":"*","object":"far","property":"Hue","action":"fail"})";
   EXPECT_EQ(read('[' + every + ']', targets), every);
-  EXPECT_EQ(
-      read(R"([{"operation":"HidDevice.setFeatureReportWithID","property":"0xc","action":"fail"}])", targets),
-      R"([0].property: "0xc" is not a property of HidDevice.setFeatureReportWithID; the ID of a feature report is )"
-      R"(written with two digits, like "0x0A".)");
+  const std::string published = R"({"operation":"RegistryService.registryProperty","property":"Hue","action":"fail"})";
+  EXPECT_EQ(read('[' + published + ']', targets), published);
+  EXPECT_EQ(read(R"([{"operation":"HidDevice.setFeatureReportWithID","property":"0xc","action":"fail"}])", targets),
+            R"([0].property: "0xc" is not a feature report's ID; write it with two digits, like "0x0A".)");
   EXPECT_EQ(read(R"([{"operation":"CaptureStream.start","object":"far","action":"fail"}])", targets),
             R"([0].object: "far" is not an object of CaptureStream.start; known are "wide", "tele".)");
 }

@@ -18,17 +18,19 @@ namespace quazor {
 
 namespace {
 
+std::vector<DeclaredFault> declared(const std::vector<FaultStatus>& statuses) {
+  std::vector<DeclaredFault> faults;
+  for (const FaultStatus& status : statuses) faults.push_back({faultJson(status.fault), status.fired});
+  return faults;
+}
+
 class PhoneOfScenario final : public Phone {
  public:
   PhoneOfScenario(const Scenario& scenario, PhoneTime time, std::uint64_t seed) : phone_(scenario, time, seed) {}
 
   Platform platform() const override { return phone_.platform(); }
 
-  std::vector<DeclaredFault> faults() const override {
-    std::vector<DeclaredFault> faults;
-    for (const FaultStatus& status : phone_.faultStatus()) faults.push_back({faultJson(status.fault), status.fired});
-    return faults;
-  }
+  std::vector<DeclaredFault> faults() const override { return declared(phone_.faultStatus()); }
 
   std::uint64_t framesDelivered() const override { return phone_.framesDelivered(); }
 
@@ -36,19 +38,16 @@ class PhoneOfScenario final : public Phone {
   SimulatedPhone phone_;
 };
 
-// This machine. Nothing is wrong with it on purpose.
 class PhoneOfBinding final : public Phone {
  public:
-  explicit PhoneOfBinding(const Binding& binding)
-      : capture_(makeLinuxCapture(binding)), platform_(linuxPlatform(binding, capture_)) {}
+  explicit PhoneOfBinding(const Binding& binding) : phone_(binding) {}
 
-  Platform platform() const override { return platform_; }
-  std::vector<DeclaredFault> faults() const override { return {}; }
-  std::uint64_t framesDelivered() const override { return capture_->framesDelivered(); }
+  Platform platform() const override { return phone_.platform(); }
+  std::vector<DeclaredFault> faults() const override { return declared(phone_.faultStatus()); }
+  std::uint64_t framesDelivered() const override { return phone_.framesDelivered(); }
 
  private:
-  const std::shared_ptr<LinuxCapture> capture_;
-  const Platform platform_;
+  LinuxPhone phone_;
 };
 
 template <class Content>

@@ -18,7 +18,7 @@
 
 namespace quazor {
 
-// A fault that the phone was told to have, as its scenario has it, and how many calls it changed.
+// A fault that the phone was told to have, as its scenario or binding has it, and how many calls it changed.
 struct DeclaredFault {
   nlohmann::ordered_json fault;
   std::uint64_t fired = 0;

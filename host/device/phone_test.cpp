@@ -102,6 +102,23 @@ TEST(PhonesOfBinding, AreThisMachine) {
   EXPECT_NE(platform.reports->reportWithOnlySimpleChannels(nullptr), nullptr);
 }
 
+TEST(PhonesOfBinding, CountsTheFaultsOfTheBinding) {
+  const TestDirectory directory;
+  const PhoneMaker makePhone = phonesOfBinding(directory.write("board.json", R"({"title": "Nothing", "faults": [
+    {"operation": "CapturePlugIn.device", "action": "fail"},
+    {"operation": "HidService.createManager", "action": "nothing"}]})"));
+  const std::unique_ptr<Phone> phone = makePhone();
+  DiagnosticErrorPtr error;
+  EXPECT_EQ(phone->platform().capture->createPlugIn()->device(&error), nullptr);
+  EXPECT_EQ(defaultText(error), "LinuxErrorDomain code 12: CapturePlugIn.device failed.");
+  const std::vector<DeclaredFault> faults = phone->faults();
+  ASSERT_EQ(faults.size(), 2U);
+  EXPECT_EQ(faults[0].fault.dump(), R"({"operation":"CapturePlugIn.device","action":"fail"})");
+  EXPECT_EQ(faults[0].fired, 1U);
+  EXPECT_EQ(faults[1].fired, 0U);
+  EXPECT_EQ(makePhone()->faults()[0].fired, 0U);
+}
+
 TEST(PhonesOfBinding, RefusesABindingThatCannotBeRead) {
   const TestDirectory directory;
   try {

@@ -39,13 +39,14 @@ ALLOWED = {
     "diagnostics/sensor_images": CONTRACT,
     "plugins": [*CONTRACT, *DIAGNOSTICS],
     "backends/threads": [*CONTRACT, "base/text"],
-    "backends/faults": [*CONTRACT, "base/json", "base/text"],
+    "backends/capture": CONTRACT,
+    "backends/faults": [*CONTRACT, "backends/capture", "base/json", "base/text"],
     "backends/counters": CONTRACT,
     "backends/hid": CONTRACT,
     SIMULATED + "time": [*CONTRACT, "backends/threads"],
-    SIMULATED + "scenario": [*CONTRACT, "backends/faults", "base/json", "base/text"],
+    SIMULATED + "scenario": [*CONTRACT, "backends/capture", "backends/faults", "base/json", "base/text"],
     SIMULATED + "calls": [*CONTRACT, "backends/faults", SIMULATED + "scenario"],
-    SIMULATED + "capture": [*CONTRACT, "backends/faults", SIMULATED + "calls", SIMULATED + "scenario"],
+    SIMULATED + "capture": [*CONTRACT, "backends/capture", "backends/faults", SIMULATED + "calls", SIMULATED + "scenario"],
     SIMULATED + "counters": [*CONTRACT, "backends/counters", "backends/faults", SIMULATED + "calls", SIMULATED + "capture",
                              SIMULATED + "scenario"],
     SIMULATED + "display": [*CONTRACT, "backends/faults", SIMULATED + "calls", SIMULATED + "scenario"],
@@ -67,7 +68,8 @@ def parts(folder):
 
 
 ALLOWED[LINUX + "probe"] = [*CONTRACT, "base/text", *parts("backends/linux")]
-ALLOWED["backends/simulated"] = [*CONTRACT, "backends/faults", "backends/threads", *parts("backends/simulated")]
+ALLOWED["backends/simulated"] = [*CONTRACT, "backends/capture", "backends/faults", "backends/threads",
+                                 *parts("backends/simulated")]
 ALLOWED["backends/linux"] = [*CONTRACT, "backends/faults", "backends/threads", *parts("backends/linux")]
 BACKENDS = [name for name in ALLOWED if name.startswith("backends/")]
 

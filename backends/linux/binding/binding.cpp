@@ -1,5 +1,6 @@
 #include "backends/linux/binding/binding.h"
 
+#include "backends/faults/fault_reader.h"
 #include "backends/linux/binding/binding_counters.h"
 #include "base/json/json_cursor.h"
 #include "platform/capture_keys.h"
@@ -192,13 +193,14 @@ std::vector<CameraBinding> readCameras(const JsonCursor& cursor) {
   return cameras;
 }
 
-GroupBinding readGroup(const JsonCursor& cursor, const std::vector<CameraBinding>& cameras) {
+GroupBinding readGroup(const std::string& name, const JsonCursor& cursor, const std::vector<CameraBinding>& cameras) {
   cursor.allowKeys({"description", "cameras", "master"});
   checkRemark(cursor, "description");
   std::vector<std::string_view> ports;
   ports.reserve(cameras.size());
   for (const CameraBinding& camera : cameras) ports.push_back(camera.port);
   GroupBinding group;
+  group.name = name;
   for (const JsonCursor& element : cursor.at("cameras").elements()) {
     const std::string port = element.oneOf(ports, "a camera of this binding");
     if (std::ranges::find(group.ports, port) != group.ports.end()) element.fail("the camera stands twice; leave one.");
@@ -210,17 +212,25 @@ GroupBinding readGroup(const JsonCursor& cursor, const std::vector<CameraBinding
   return group;
 }
 
+// HID devices, their reports and what a display publishes are only known when they are used.
+FaultTargets targetsOf(const Binding& binding) {
+  FaultTargets targets;
+  for (const CameraBinding& camera : binding.cameras) targets.streams.push_back(camera.port);
+  for (const GroupBinding& group : binding.groups) targets.groups.push_back(group.name);
+  return targets;
+}
+
 Binding bindingOf(const JsonCursor& document) {
   document.allowKeys(
-      {"$schema", "title", "description", "cameras", "groups", "counterFiles", "tracepoints", "display"});
+      {"$schema", "title", "description", "cameras", "groups", "counterFiles", "tracepoints", "display", "faults"});
   checkRemark(document, "$schema");
   checkRemark(document, "description");
   Binding binding;
   binding.title = document.at("title").text();
   if (const auto cameras = document.find("cameras")) binding.cameras = readCameras(*cameras);
   if (const auto groups = document.find("groups")) {
-    for (const auto& [ignored, group] : groups->entries()) {
-      binding.groups.push_back(readGroup(group, binding.cameras));
+    for (const auto& [name, group] : namedEntries(*groups)) {
+      binding.groups.push_back(readGroup(name, group, binding.cameras));
     }
   }
   if (const auto files = document.find("counterFiles")) binding.counterFiles = readAllCounterFiles(*files);
@@ -234,6 +244,7 @@ Binding bindingOf(const JsonCursor& document) {
       connector.fail("must be the connector's name without that of its card, as \"HDMI-A-1\".");
     }
   }
+  if (const auto faults = document.find("faults")) binding.faults = readFaults(*faults, targetsOf(binding));
   return binding;
 }
 

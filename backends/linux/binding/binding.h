@@ -1,6 +1,7 @@
 // Binding: which of a Linux machine's devices stand for which parts of the phone.
 #pragma once
 
+#include "backends/faults/fault.h"
 #include "contract/ordered_map.h"
 #include "contract/value.h"
 
@@ -86,6 +87,7 @@ struct CameraBinding {
 struct GroupBinding {
   std::vector<std::string> ports;
   std::string master;  // one of them
+  std::string name{};  // by which faults select it
 };
 
 // Files whose numbers are report channels.
@@ -122,6 +124,8 @@ struct Binding {
   std::vector<CounterFilesBinding> counterFiles;
   std::vector<TracepointBinding> tracepoints;
   std::optional<DisplayBinding> display;  // nothing: the first connector that is connected
+  // What is made to go wrong. Cameras are selected by their ports, HID devices by the names that they give themselves.
+  std::vector<Fault> faults;
 };
 
 // Reads a binding file (data/bindings/binding.schema.json describes its form). Throws InputError: one sentence

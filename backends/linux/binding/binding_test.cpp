@@ -377,6 +377,45 @@ TEST_F(BindingTest, RefusesCountersThatCannotBe) {
   for (const Refused& row : kRows) EXPECT_EQ(problemOf(row.text), row.problem) << row.what;
 }
 
+TEST_F(BindingTest, ReadsFaultsOfWhatItBinds) {
+  std::string problem;
+  const std::optional<Binding> binding = read(R"({"title": "t",
+    "cameras": {"BackFacingCamera": {"node": {"card": "c"}, "size": {"width": 1, "height": 1}}},
+    "groups": {"back": {"cameras": ["BackFacingCamera"], "master": "BackFacingCamera"}},
+    "faults": [
+      {"operation": "CaptureStream.start", "object": "BackFacingCamera", "occurrence": 2, "action": "hang"},
+      {"operation": "SynchronizedStreamsGroup.streams", "object": "back", "action": "nothing"},
+      {"operation": "HidDevice.setFeatureReportWithID", "object": "Any Sensor", "property": "0xAB", "action": "fail"},
+      {"operation": "RegistryService.registryProperty", "property": "Power", "action": "delay", "seconds": 0.5}]})",
+                                              &problem);
+  ASSERT_TRUE(binding) << problem;
+  ASSERT_EQ(binding->faults.size(), 4U);
+  EXPECT_EQ(binding->faults[0],
+            (Fault{"CaptureStream.start", "BackFacingCamera", std::nullopt, 2, FaultAction::kHang, std::nullopt, 0}));
+  EXPECT_EQ(binding->faults[1].object, "back");
+  EXPECT_EQ(binding->faults[2].object, "Any Sensor");
+  EXPECT_EQ(binding->faults[3].seconds, 0.5);
+}
+
+TEST_F(BindingTest, RefusesFaultsThatCannotBe) {
+  const std::string camera =
+      R"("cameras": {"BackFacingCamera": {"node": {"card": "c"}, "size": {"width": 1, "height": 1}}}, "faults": )";
+  const Refused kRows[] = {
+      {"no list", with("\"faults\": {}"), "F:2: faults: must be an array, not an object."},
+      {"a camera that is not bound",
+       with(camera + R"([{"operation": "CaptureStream.start", "object": "FrontFacingCamera", "action": "fail"}])"),
+       "F:2: faults[0].object: \"FrontFacingCamera\" is not an object of CaptureStream.start; did you mean "
+       "\"BackFacingCamera\"?"},
+      {"a group where there is none",
+       with(R"("faults": [{"operation": "SynchronizedStreamsGroup.streams", "object": "back", "action": "fail"}])"),
+       "F:2: faults[0].object: SynchronizedStreamsGroup.streams is not called on a camera, a group or a HID device; "
+       "leave it out."},
+      {"a group without a name", with(camera + R"([], "groups": {"": {"cameras": [], "master": "m"}})"),
+       "F:2: groups: an entry has no name; give it one."},
+  };
+  for (const Refused& row : kRows) EXPECT_EQ(problemOf(row.text), row.problem) << row.what;
+}
+
 TEST_F(BindingTest, RefusesWhatIsNoBinding) {
   const Refused kRows[] = {
       {"no JSON", "{\n]", "F:2: this is not JSON: "},

@@ -61,6 +61,7 @@ class LinuxHidDevice final : public HidDevice {
   ~LinuxHidDevice() override { input_->retire(); }
 
   std::string description() const override { return "HID device " + name() + " \"" + node_.name + "\""; }
+  std::string ownName() const { return node_.name.empty() ? name() : node_.name; }
 
   bool open(DiagnosticErrorPtr* error) override {
     if (input_->descriptor() != nullptr) return refuse(error, LinuxErrorCode::kWrongState, "is open already");
@@ -173,6 +174,11 @@ class LinuxHidService final : public HidService {
 };
 
 }  // namespace
+
+std::string linuxHidName(const HidDevice& device) {
+  const auto* const own = dynamic_cast<const LinuxHidDevice*>(&device);
+  return own == nullptr ? std::string() : own->ownName();
+}
 
 std::shared_ptr<HidrawCalls> makeHidrawCalls() { return std::make_shared<KernelCalls>(); }
 

@@ -7,6 +7,7 @@
 
 #include <chrono>
 #include <memory>
+#include <string>
 
 namespace quazor {
 
@@ -24,6 +25,10 @@ inline constexpr std::chrono::milliseconds kHidAnswerTime{4500};
 std::shared_ptr<HidService> makeLinuxHid();
 // The same with another kernel. `calls` must not be null.
 std::shared_ptr<HidService> makeLinuxHid(HidrawRoots roots, std::shared_ptr<HidrawCalls> calls);
+
+// What a device of this service calls itself, as "Acme Sensor"; its path where it says nothing, and empty for a device
+// that is none of this service. Any thread.
+std::string linuxHidName(const HidDevice& device);
 
 // The kernel's own calls.
 std::shared_ptr<HidrawCalls> makeHidrawCalls();

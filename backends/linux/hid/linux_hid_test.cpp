@@ -75,6 +75,13 @@ class LinuxHidTest : public ::testing::Test {
   std::shared_ptr<FakeHidrawCalls> calls_ = std::make_shared<FakeHidrawCalls>();
 };
 
+TEST_F(LinuxHidTest, ADevicesNameIsWhatItCallsItself) {
+  const std::shared_ptr<HidDevice> device = sensor();
+  const std::string description = device->description();
+  EXPECT_THAT(description, ::testing::EndsWith(" \"" + linuxHidName(*device) + "\""));
+  EXPECT_NE(linuxHidName(*device), "");
+}
+
 TEST_F(LinuxHidTest, DictionariesMatchDevicesThatHaveAllTheirEntries) {
   tree_.connect("hidraw0", sensorDescriptor(0x24));
   tree_.connect("hidraw1", sensorDescriptor(0x25));

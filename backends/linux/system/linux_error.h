@@ -24,7 +24,8 @@ enum class LinuxErrorCode : std::int64_t {
   kBusy = 8,          // somebody else uses the device
   kDeviceGone = 9,    // the device was removed
   kNoSuchProperty = 10,
-  kNoAnswer = 11  // the device did not answer in time
+  kNoAnswer = 11,  // the device did not answer in time
+  kInjected = 12   // a fault of the binding asked for a failure and gave no error of its own
 };
 
 // True of the errors (errno) of a caller who lacks permission.

@@ -4,8 +4,8 @@
 // names the object whose property it is.
 #pragma once
 
+#include "backends/capture/property_table.h"
 #include "backends/simulated/calls/capture_error.h"
-#include "backends/simulated/scenario/property_table.h"
 #include "contract/value.h"
 
 #include <cstdint>

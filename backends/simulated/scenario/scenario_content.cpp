@@ -1,8 +1,8 @@
 #include "backends/simulated/scenario/scenario_content.h"
 
+#include "backends/capture/property_table.h"
 #include "backends/faults/fault_reader.h"
 #include "backends/faults/hid_report_name.h"
-#include "backends/simulated/scenario/property_table.h"
 #include "backends/simulated/scenario/scenario_frames.h"
 #include "backends/simulated/scenario/scenario_parts.h"
 #include "backends/simulated/scenario/scenario_sensors.h"
@@ -130,28 +130,20 @@ std::optional<FaultError> readOptionalError(const JsonCursor& object, std::strin
   return readFaultError(*entry);
 }
 
-std::vector<std::string> keysOf(CaptureObjectKind kind) {
-  std::vector<std::string> keys;
-  for (const CaptureProperty& property : propertiesOf(kind)) keys.emplace_back(property.key);
-  return keys;
-}
-
 FaultTargets targetsOf(const Scenario& scenario) {
   FaultTargets targets;
   for (const Camera& camera : scenario.cameras) targets.streams.push_back(camera.id);
   for (const CameraGroup& group : scenario.groups) targets.groups.push_back(group.id);
-  targets.deviceProperties = keysOf(CaptureObjectKind::kDevice);
-  targets.groupProperties = keysOf(CaptureObjectKind::kGroup);
-  targets.streamProperties = keysOf(CaptureObjectKind::kStream);
   targets.hidDevices.emplace();
   targets.featureReports.emplace();
+  targets.registryProperties.emplace();
   for (const HidDeviceConfig& device : scenario.hidDevices) {
     targets.hidDevices->push_back(device.name);
     for (const HidFeatureReport& report : device.featureReports) {
       targets.featureReports->emplace_back(hidReportName(report.id));
     }
   }
-  for (const auto& [name, value] : scenario.display.properties) targets.registryProperties.push_back(name);
+  for (const auto& [name, value] : scenario.display.properties) targets.registryProperties->push_back(name);
   return targets;
 }
 

@@ -1,4 +1,4 @@
-#include "backends/simulated/scenario/property_table.h"
+#include "backends/capture/property_table.h"
 
 #include <algorithm>
 
