@@ -1,20 +1,14 @@
 // What a HID device says of itself in its report descriptor (USB HID 1.11, section 6.2.2).
 #pragma once
 
+#include "backends/hid/hid_matching.h"
+
 #include <cstdint>
 #include <map>
 #include <span>
 #include <vector>
 
 namespace quazor {
-
-// What a collection or a control is for, by the HID usage tables; page 0xFF00 and above are the vendors'.
-struct HidUsage {
-  std::uint16_t page = 0;
-  std::uint16_t usage = 0;
-
-  bool operator==(const HidUsage&) const = default;
-};
 
 struct HidReportDescriptor {
   // The largest report that Linux takes, in bytes.

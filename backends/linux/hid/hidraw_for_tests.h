@@ -27,49 +27,15 @@
 namespace quazor {
 
 // Input report 0x76 of `length` bytes with its ID, feature reports 0xAB and 0xAC of two, of the vendors' page 0xFF00.
-inline Bytes sensorDescriptor(std::uint8_t usage = 0x24, std::uint16_t length = 792) {
+inline Bytes sensorDescriptor(std::uint16_t page, std::uint8_t usage, std::uint16_t length = 792) {
   const auto fields = static_cast<std::uint16_t>(length - 1);
-  return {0x06,
-          0x00,
-          0xFF,
-          0x09,
-          usage,
-          0xA1,
-          0x01,
-          0x15,
-          0x00,
-          0x26,
-          0xFF,
-          0x00,
-          0x75,
-          0x08,
-          0x85,
-          0x76,
-          0x09,
-          0x76,
-          0x96,
-          static_cast<std::uint8_t>(fields),
-          static_cast<std::uint8_t>(fields >> 8),
-          0x81,
-          0x02,
-          0x85,
-          0xAB,
-          0x09,
-          0xAB,
-          0x95,
-          0x01,
-          0xB1,
-          0x02,
-          0x85,
-          0xAC,
-          0x09,
-          0xAC,
-          0x95,
-          0x01,
-          0xB1,
-          0x02,
-          0xC0};
+  const auto low = [](std::uint16_t number) { return static_cast<std::uint8_t>(number); };
+  const auto high = [](std::uint16_t number) { return static_cast<std::uint8_t>(number >> 8); };
+  return {0x06, low(page), high(page), 0x09, usage, 0xA1,        0x01,         0x15, 0x00, 0x26, 0xFF, 0x00, 0x75, 0x08,
+          0x85, 0x76,      0x09,       0x76, 0x96,  low(fields), high(fields), 0x81, 0x02, 0x85, 0xAB, 0x09, 0xAB, 0x95,
+          0x01, 0xB1,      0x02,       0x85, 0xAC,  0x09,        0xAC,         0x95, 0x01, 0xB1, 0x02, 0xC0};
 }
+inline Bytes sensorDescriptor(std::uint8_t usage = 0x24) { return sensorDescriptor(0xFF00, usage); }
 
 // Two input bytes without an ID, and a feature report of one.
 inline Bytes unnumberedDescriptor() {

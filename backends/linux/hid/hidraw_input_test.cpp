@@ -87,19 +87,6 @@ class HidrawInputTest : public ::testing::Test {
   std::function<void()> onInput_;
 };
 
-TEST_F(HidrawInputTest, ReportsReachTheReceiverOneByOneWhenTheLoopRuns) {
-  openAndSchedule();
-  for (const int number : {3, 1, 2}) send(number);
-  EXPECT_THAT(seen_, IsEmpty());
-  EXPECT_EQ(run(), RunLoopResult::kTimedOut);
-  EXPECT_THAT(seen_, ElementsAre("7603, 2", "7601, 2", "7602, 2"));
-  run();
-  EXPECT_THAT(seen_, SizeIs(3));
-  send(4);
-  run();
-  EXPECT_THAT(seen_, SizeIs(4));
-}
-
 TEST_F(HidrawInputTest, AReportWakesALoopThatSleeps) {
   openAndSchedule();
   onInput_ = [this] { loop_.stop(); };
@@ -128,58 +115,6 @@ TEST_F(HidrawInputTest, ReportsWithoutAnIDGetTheIDZero) {
   sendReport(device_, Bytes(HidrawInput::kMaxLength - 1, 0xEE));
   run();
   EXPECT_THAT(seen_, ElementsAre("001234, 3", "00eeee, 16385"));
-}
-
-TEST_F(HidrawInputTest, WhatComesWhileTheDeviceIsNotScheduledIsLost) {
-  open();
-  send(1);
-  send(2);
-  schedule();
-  send(3);
-  run();
-  EXPECT_THAT(seen_, ElementsAre("7603, 2"));
-  unschedule();
-  send(4);
-  run();
-  schedule();
-  send(5);
-  run();
-  EXPECT_THAT(seen_, ElementsAre("7603, 2", "7605, 2"));
-  EXPECT_EQ(run(1ms), RunLoopResult::kTimedOut);
-}
-
-TEST_F(HidrawInputTest, WhatIsScheduledInASecondModeKeepsItsReports) {
-  openAndSchedule();
-  send(1);
-  schedule(kOther);
-  run(0ns, kOther);
-  EXPECT_THAT(seen_, ElementsAre("7601, 2"));
-  send(2);
-  unschedule(kOther);
-  EXPECT_EQ(run(10s, kOther), RunLoopResult::kFinished);
-  run();
-  EXPECT_THAT(seen_, ElementsAre("7601, 2", "7602, 2"));
-}
-
-TEST_F(HidrawInputTest, ADeviceCanBeScheduledBeforeItIsOpened) {
-  schedule();
-  EXPECT_EQ(run(1ms), RunLoopResult::kTimedOut);
-  open();
-  send(1);
-  run();
-  EXPECT_THAT(seen_, ElementsAre("7601, 2"));
-}
-
-TEST_F(HidrawInputTest, SchedulingTwiceIsSchedulingOnceAndUnschedulingWhatIsNotHasNoEffect) {
-  openAndSchedule();
-  send(1);
-  schedule();
-  unschedule(kOther);
-  run();
-  EXPECT_THAT(seen_, ElementsAre("7601, 2"));
-  unschedule();
-  unschedule();
-  EXPECT_EQ(run(10s), RunLoopResult::kFinished);
 }
 
 TEST_F(HidrawInputTest, ARoundHasAnEnd) {
@@ -218,15 +153,6 @@ TEST_F(HidrawInputTest, ARemovedDeviceGivesWhatIsKeptAndThenTheErrorOnce) {
   run();
   run(0ns, kOther);
   EXPECT_THAT(seen_, SizeIs(3));
-}
-
-TEST_F(HidrawInputTest, ADeviceThatWasRemovedBeforeItIsScheduledTellsSo) {
-  open();
-  send(1);
-  device_.reset();
-  schedule();
-  run();
-  EXPECT_THAT(seen_, ElementsAre(kGone));
 }
 
 TEST_F(HidrawInputTest, ADeviceThatIsOpenedAnewTellsItsErrorAnew) {
@@ -355,34 +281,6 @@ TEST_F(HidrawInputTest, ADeviceThatIsClosedOnAnotherThreadDoesNotWaitForItsLoopT
   other.join();
 }
 
-TEST_F(HidrawInputTest, WithoutAReceiverReportsAreLost) {
-  openAndSchedule();
-  input_->setReceiver({});
-  send(1);
-  run();
-  input_->setReceiver(receiver());
-  send(2);
-  run();
-  EXPECT_THAT(seen_, ElementsAre("7602, 2"));
-}
-
-TEST_F(HidrawInputTest, TheReceiverMayReplaceItselfAndGoesWhenItHasReturned) {
-  openAndSchedule();
-  bool gone = false;
-  std::shared_ptr<void> guard(nullptr, [&gone](void*) { gone = true; });
-  input_->setReceiver(
-      [this, &gone, held = std::move(guard)](std::uint8_t, std::span<const std::uint8_t>, const DiagnosticErrorPtr&) {
-        input_->setReceiver(receiver());
-        EXPECT_FALSE(gone);
-        seen_.push_back("first receiver");
-      });
-  send(1);
-  send(2);
-  run();
-  EXPECT_TRUE(gone);
-  EXPECT_THAT(seen_, ElementsAre("first receiver", "7602, 2"));
-}
-
 TEST_F(HidrawInputTest, TheReceiverMayEndItAllInItsOwnCall) {
   const struct {
     const char* name;
@@ -415,18 +313,6 @@ TEST_F(HidrawInputTest, TheReceiverMayEndItAllInItsOwnCall) {
     EXPECT_EQ(::fcntl(descriptor, F_GETFD), -1) << row.name;
     run();
   }
-}
-
-TEST_F(HidrawInputTest, TheReceiverMayRunTheLoopAndGetTheNextReportThere) {
-  openAndSchedule();
-  onInput_ = [this] {
-    const std::string mine = seen_.back();
-    if (seen_.size() < 3) run();
-    seen_.push_back("after " + mine);
-  };
-  for (const int number : {1, 2, 3}) send(number);
-  run();
-  EXPECT_THAT(seen_, ElementsAre("7601, 2", "7602, 2", "7603, 2", "after 7603, 2", "after 7602, 2", "after 7601, 2"));
 }
 
 TEST_F(HidrawInputTest, ALoopThatCannotWaitForDescriptorsGetsAnErrorOnce) {

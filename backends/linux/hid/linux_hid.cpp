@@ -1,5 +1,6 @@
 #include "backends/linux/hid/linux_hid.h"
 
+#include "backends/hid/hid_matching.h"
 #include "backends/linux/hid/hidraw_input.h"
 #include "backends/linux/system/linux_error.h"
 
@@ -8,8 +9,8 @@
 #include <sys/ioctl.h>
 #include <unistd.h>
 
-#include <algorithm>
 #include <cerrno>
+#include <optional>
 #include <string>
 #include <utility>
 #include <vector>
@@ -36,19 +37,9 @@ class KernelCalls final : public HidrawCalls {
 // Bits of a request's number are left for the length.
 constexpr std::size_t kMaxFeatureLength = (std::size_t{1} << _IOC_SIZEBITS) - 1;
 
-bool isNumber(const Value& value, std::uint16_t number) {
-  return value.isNumber() && toDouble(&value) == static_cast<double>(number);
-}
-
-// Whether the device has all entries of the dictionary.
-bool matches(const HidrawNode& node, const Dictionary& wanted) {
+std::optional<HidUsage> primaryUsage(const HidrawNode& node) {
   const std::vector<HidUsage>& usages = node.descriptor.topLevel;
-  return std::ranges::all_of(wanted, [&usages](const auto& entry) {
-    const auto& [key, value] = entry;
-    if (usages.empty()) return false;
-    return (key == kHidPrimaryUsagePage && isNumber(value, usages.front().page)) ||
-           (key == kHidPrimaryUsage && isNumber(value, usages.front().usage));
-  });
+  return usages.empty() ? std::nullopt : std::optional(usages.front());
 }
 
 class LinuxHidDevice final : public HidDevice {
@@ -144,8 +135,7 @@ class LinuxHidManager final : public HidManager {
   void enumerateDevicesMatching(const std::vector<Dictionary>& matching) override {
     found_.clear();
     for (HidrawNode& node : hidrawNodes(roots_)) {
-      const auto isMatch = [&node](const Dictionary& wanted) { return matches(node, wanted); };
-      if (!std::ranges::any_of(matching, isMatch)) continue;
+      if (!matchesHidDevice(matching, primaryUsage(node))) continue;
       found_.push_back(std::make_shared<LinuxHidDevice>(std::move(node), roots_, calls_));
     }
   }

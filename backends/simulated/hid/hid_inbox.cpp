@@ -1,6 +1,5 @@
 #include "backends/simulated/hid/hid_inbox.h"
 
-#include <algorithm>
 #include <utility>
 
 namespace quazor {
@@ -13,107 +12,43 @@ void HidInbox::open() {
 void HidInbox::close() {
   const std::lock_guard lock(mutex_);
   open_ = false;
-  dropUnlessReceivable();
-}
-
-void HidInbox::setReceiver(HidDevice::InputReportCallback receiver) {
-  Receiver replacement =
-      receiver ? std::make_shared<const HidDevice::InputReportCallback>(std::move(receiver)) : nullptr;
-  const std::lock_guard lock(mutex_);
-  receiver_.swap(replacement);
-}
-
-void HidInbox::schedule(RunLoop& loop, std::string_view mode) {
-  const auto place = std::make_shared<Place>();
-  place->loop = &loop;
-  place->mode = mode;
-  // The handler does not keep the inbox, which ends with its user; then it ends its own source.
-  const std::shared_ptr<RunLoopSource> source = loop.makeSource([weak = weak_from_this(), place] {
-    const std::shared_ptr<HidInbox> self = weak.lock();
-    if (self == nullptr || !self->deliver(*place)) place->loop->removeSource(place->source.lock(), place->mode);
-  });
-  place->source = source;
-  {
-    const std::lock_guard lock(mutex_);
-    if (find(loop, mode) != places_.end()) return;
-    places_.push_back({place, source});
-    if (!waiting_.empty()) source->signal();  // what waits for another place may be left to this one
-  }
-  loop.addSource(source, mode);
-}
-
-void HidInbox::unschedule(RunLoop& loop, std::string_view mode) {
-  std::shared_ptr<RunLoopSource> source;
-  {
-    const std::lock_guard lock(mutex_);
-    const auto found = find(loop, mode);
-    if (found == places_.end()) return;
-    source = found->source;
-    places_.erase(found);
-    dropUnlessReceivable();
-  }
-  loop.removeSource(source, mode);
-}
-
-void HidInbox::retire() {
-  Receiver receiver;
-  const std::lock_guard lock(mutex_);
-  receiver_.swap(receiver);
-  open_ = false;
-  for (const Scheduled& scheduled : places_) scheduled.source->signal();
-  places_.clear();
-  dropUnlessReceivable();
+  waiting_.clear();
 }
 
 void HidInbox::take(std::shared_ptr<const HidInput> input) {
   const std::lock_guard lock(mutex_);
   if (waiting_.size() >= kDepth && input->error == nullptr) return;
   waiting_.push_back(std::move(input));
-  dropUnlessReceivable();
+  discardWhatIsLost();
   if (waiting_.empty()) return;
-  for (const Scheduled& scheduled : places_) scheduled.source->signal();
+  for (const Scheduled& scheduled : places()) signal(*scheduled.place);
 }
 
-void HidInbox::dropUnlessReceivable() {
-  if (!open_ || places_.empty()) waiting_.clear();
+std::shared_ptr<const HidInput> HidInbox::next(const Place& /*place*/) {
+  if (waiting_.empty()) return nullptr;
+  std::shared_ptr<const HidInput> input = std::move(waiting_.front());
+  waiting_.pop_front();
+  return input;
 }
 
-bool HidInbox::isScheduled(const Place& place) const {
-  return std::ranges::any_of(places_, [&](const Scheduled& scheduled) { return scheduled.place.get() == &place; });
+void HidInbox::onScheduled(const Place& place) {
+  if (!waiting_.empty()) signal(place);
 }
 
-std::vector<HidInbox::Scheduled>::const_iterator HidInbox::find(const RunLoop& loop, std::string_view mode) const {
-  return std::ranges::find_if(places_, [&](const Scheduled& scheduled) {
-    return scheduled.place->loop == &loop && scheduled.place->mode == mode;
-  });
+void HidInbox::onUnscheduled(const Place& /*place*/) { discardWhatIsLost(); }
+
+void HidInbox::onRetired() {
+  open_ = false;
+  waiting_.clear();
 }
 
-// Not more than wait now: a receiver that is slower than the device must not keep its loop from its time limit. What
-// comes meanwhile signals the source again.
-bool HidInbox::deliver(const Place& place) {
-  std::size_t count = 0;
-  {
-    const std::lock_guard lock(mutex_);
-    if (!isScheduled(place)) return false;
-    count = waiting_.size();
-  }
-  while (count > 0 && deliverOne(place)) --count;
-  return true;
+void HidInbox::onRoundBegan(const Place& place) {
+  if (waiting_.size() > 1) signal(place);
 }
 
-// Looks at everything anew: the receiver may have changed all of it.
-bool HidInbox::deliverOne(const Place& place) {
-  std::shared_ptr<const HidInput> input;
-  Receiver receiver;
-  {
-    const std::lock_guard lock(mutex_);
-    if (waiting_.empty() || !isScheduled(place)) return false;
-    input = std::move(waiting_.front());
-    waiting_.pop_front();
-    receiver = receiver_;
-  }
-  if (receiver != nullptr) (*receiver)(input->reportID, input->report, input->error);
-  return true;
+void HidInbox::discardWhatIsLost() {
+  if (!open_) waiting_.clear();
+  if (places().empty()) std::erase_if(waiting_, [](const auto& input) { return input->error == nullptr; });
 }
 
 }  // namespace quazor

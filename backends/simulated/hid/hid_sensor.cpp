@@ -1,5 +1,6 @@
 #include "backends/simulated/hid/hid_sensor.h"
 
+#include "backends/hid/hid_matching.h"
 #include "backends/simulated/capture/frame_delivery.h"
 #include "backends/simulated/hid/hid_image_report.h"
 #include "backends/simulated/scenario/sensor_operations.h"
@@ -8,13 +9,6 @@
 #include <utility>
 
 namespace quazor {
-namespace {
-
-bool isNumber(const Value& value, std::uint16_t number) {
-  return value.isNumber() && toDouble(&value) == static_cast<double>(number);
-}
-
-}  // namespace
 
 HidSensor::HidSensor(HidDeviceConfig traits, std::shared_ptr<Clock> clock, Concurrency& concurrency)
     : traits_(std::move(traits)),
@@ -23,13 +17,9 @@ HidSensor::HidSensor(HidDeviceConfig traits, std::shared_ptr<Clock> clock, Concu
   for (const HidFeatureReport& report : traits_.featureReports) values_[report.id] = 0;
 }
 
-bool HidSensor::matches(const Dictionary& wanted) const {
+bool HidSensor::matches(const std::vector<Dictionary>& matching) const {
   const std::lock_guard lock(mutex_);
-  return !gone_ && std::ranges::all_of(wanted, [this](const auto& entry) {
-    const auto& [key, value] = entry;
-    return (key == kHidPrimaryUsagePage && isNumber(value, traits_.usagePage)) ||
-           (key == kHidPrimaryUsage && isNumber(value, traits_.usage));
-  });
+  return !gone_ && matchesHidDevice(matching, HidUsage{traits_.usagePage, traits_.usage});
 }
 
 bool HidSensor::hasOpen(const std::shared_ptr<HidInbox>& user) const {
@@ -129,18 +119,16 @@ HidInput HidSensor::makeInput(std::uint64_t number) {
     gone_ = true;
     DiagnosticErrorPtr error;
     refuse(&error, HidErrorCode::kGone, "%@ has been removed.", traits_.name);
-    return {0, {}, std::move(error)};
+    return {{}, std::move(error)};
   }
   HidReportShape shape = traits_.every;
   if (const auto single = traits_.single.find(number); single != traits_.single.end()) {
     const HidReportShape& own = single->second;
-    if (own.error) return {0, {}, errorWithMessage(own.error->domain, own.error->code, own.error->message, nullptr)};
+    if (own.error) return {{}, errorWithMessage(own.error->domain, own.error->code, own.error->message, nullptr)};
     if (own.reportID) shape.reportID = own.reportID;
     if (own.length) shape.length = own.length;
   }
-  Bytes report = hidInputReport(traits_.images, shape, number, clock_->now());
-  const std::uint8_t reportID = report.front();
-  return {reportID, std::move(report), nullptr};
+  return {hidInputReport(traits_.images, shape, number, clock_->now()), nullptr};
 }
 
 }  // namespace quazor

@@ -30,8 +30,8 @@ class HidSensor final : public std::enable_shared_from_this<HidSensor> {
   HidSensor& operator=(const HidSensor&) = delete;
 
   const HidDeviceConfig& traits() const { return traits_; }
-  // Whether it has all entries of a matching dictionary, and is not gone.
-  bool matches(const Dictionary& wanted) const;
+  // Whether it is there and has all entries of one of the dictionaries.
+  bool matches(const std::vector<Dictionary>& matching) const;
 
   // Opens and closes it for the user whose inbox that is. Closing what is not open has no effect.
   bool open(const std::shared_ptr<HidInbox>& user, DiagnosticErrorPtr* error);

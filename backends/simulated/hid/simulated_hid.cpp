@@ -3,7 +3,6 @@
 #include "backends/simulated/scenario/sensor_operations.h"
 #include "contract/message_format.h"
 
-#include <algorithm>
 #include <optional>
 #include <string>
 #include <utility>
@@ -117,8 +116,7 @@ class SimulatedHidService::Manager final : public HidManager {
   void find(const std::vector<Dictionary>& matching) {
     found_.clear();
     for (const std::shared_ptr<HidSensor>& sensor : *sensors_) {
-      const auto matches = [&](const Dictionary& wanted) { return sensor->matches(wanted); };
-      if (std::ranges::any_of(matching, matches)) found_.push_back(std::make_shared<Device>(sensor, calls_));
+      if (sensor->matches(matching)) found_.push_back(std::make_shared<Device>(sensor, calls_));
     }
   }
 

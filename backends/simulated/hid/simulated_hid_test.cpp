@@ -33,52 +33,9 @@ class SimulatedHidTest : public ::testing::Test {
   void make(std::vector<HidDeviceConfig> sensors) {
     phone_.emplace(sensorScenario(std::move(sensors)), PhoneTime::kVirtual, 1);
   }
-  // The names of the devices that one of the dictionaries matches.
-  std::vector<std::string> found(const std::vector<Dictionary>& matching) {
-    const std::shared_ptr<HidManager> manager = phone_->platform().hid->createManager();
-    manager->enumerateDevicesMatching(matching);
-    std::vector<std::string> names;
-    for (const auto& device : manager->devices()) names.push_back(device->description());
-    return names;
-  }
 
   std::optional<SimulatedPhone> phone_;
 };
-
-TEST_F(SimulatedHidTest, DictionariesMatchDevicesThatHaveAllTheirEntries) {
-  HidDeviceConfig second = testSensor();
-  second.name = "second";
-  second.usage = 0x25;
-  make({testSensor(), second});
-  const std::string first = "HID device sensor (usage page 65280, usage 36)";
-  const std::string other = "HID device second (usage page 65280, usage 37)";
-  const struct {
-    const char* name;
-    std::vector<Dictionary> matching;
-    std::vector<std::string> found;
-  } kRows[] = {
-      {"signed numbers", {matchingUsage(65280, 36)}, {first}},
-      {"unsigned numbers", {matchingUsage(65280U, 36U)}, {first}},
-      {"doubles", {matchingUsage(65280.0, 36.0)}, {first}},
-      {"a double between", {matchingUsage(65280, 36.5)}, {}},
-      {"another usage", {matchingUsage(65280, 38)}, {}},
-      {"another page", {matchingUsage(1, 36)}, {}},
-      {"texts", {matchingUsage("65280", 36)}, {}},
-      {"page and usage exchanged", {matchingUsage(36, 65280)}, {}},
-      {"only the page", {{{"PrimaryUsagePage", 65280}}}, {first, other}},
-      {"only the usage", {{{"PrimaryUsage", 37}}}, {other}},
-      {"no entry", {Dictionary{}}, {first, other}},
-      {"an unknown entry", {{{"PrimaryUsage", 36}, {"Product", "x"}}}, {}},
-      {"several dictionaries", {matchingUsage(65280, 37), Dictionary{}, matchingUsage(65280, 36)}, {first, other}},
-      {"no dictionary", {}, {}},
-  };
-  for (const auto& row : kRows) EXPECT_EQ(found(row.matching), row.found) << row.name;
-}
-
-TEST_F(SimulatedHidTest, APhoneMayHaveNoDevices) {
-  make({});
-  EXPECT_THAT(found({Dictionary{}}), IsEmpty());
-}
 
 TEST_F(SimulatedHidTest, AManagerTellsWhatItsLastEnumerationFound) {
   make({testSensor()});

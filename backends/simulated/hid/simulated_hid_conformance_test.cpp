@@ -1,0 +1,63 @@
+#include "backends/hid/hid_conformance.h"
+#include "backends/simulated/hid/sensor_user_for_tests.h"
+#include "backends/simulated/hid/simulated_hid.h"
+#include "backends/simulated/simulated_phone.h"
+
+#include <chrono>
+#include <map>
+#include <memory>
+#include <optional>
+#include <string>
+#include <vector>
+
+namespace quazor {
+namespace {
+
+// Sensors that send a hundred reports per second while they are open, in virtual time.
+class SimulatedHidUnderTest {
+ public:
+  SimulatedHidUnderTest() { connect({}, {}); }
+
+  // The first phone's loops, clock and queues go on to serve: a fixture keeps its loop.
+  void connect(const std::vector<ConformanceDevice>& devices, const std::map<int, ConformanceEvent>& events) {
+    std::vector<HidDeviceConfig> sensors;
+    for (const ConformanceDevice& device : devices) {
+      HidDeviceConfig sensor;
+      sensor.name = "sensor " + std::to_string(sensors.size());
+      sensor.usagePage = device.page;
+      sensor.usage = device.usage;
+      sensor.featureReports = {{0xAB, {}, std::nullopt}};
+      sensor.rate = 100;
+      for (const auto& [number, event] : events) {
+        const auto index = static_cast<std::uint64_t>(number - 1);
+        if (event == ConformanceEvent::kError) {
+          sensor.single[index].error = FaultError{"Sensor", 1, "The report was damaged."};
+        } else {
+          sensor.removedAfter = index;
+        }
+      }
+      sensors.push_back(sensor);
+    }
+    if (!phone_) phone_.emplace(sensorScenario({}), PhoneTime::kVirtual, 1);
+    const Platform platform = phone_->platform();
+    hid_ = std::make_shared<SimulatedHidService>(sensors, platform.clock, *platform.concurrency, calls_);
+  }
+  std::shared_ptr<HidManager> manager() { return hid_->createManager(); }
+  // A moment more than the time between reports, so that what is due then has come.
+  void arrive(int count) {
+    phone_->platform().clock->sleep(count * std::chrono::milliseconds(10) + std::chrono::microseconds(1));
+  }
+  RunLoops& runLoops() { return *phone_->platform().runLoops; }
+  Concurrency& concurrency() { return *phone_->platform().concurrency; }
+
+ private:
+  std::optional<SimulatedPhone> phone_;
+  const std::shared_ptr<CallInterceptor> calls_ =
+      std::make_shared<CallInterceptor>(std::vector<Fault>{}, nullptr, CallInterceptor::Hang{});
+  std::shared_ptr<HidService> hid_;
+};
+
+INSTANTIATE_TYPED_TEST_SUITE_P(Simulated, HidConformance, SimulatedHidUnderTest);
+
+}  // namespace
+}  // namespace quazor
