@@ -45,8 +45,8 @@ class QUAZOR_EXPORT HidDevice : public Object {
   // Sends a feature report. `payload` is the whole report, the byte of its ID first.
   virtual bool setFeatureReportWithID(std::uint8_t reportID, std::span<const std::uint8_t> payload,
                                       DiagnosticErrorPtr* error) = 0;
-  // From now on input reports, and errors of the device, come through the loop, in this mode. `runLoop` must be alive
-  // until the device is unscheduled from it. Reports that come while the device is open and not scheduled are lost.
+  // From now on input reports and errors of the device come through the loop, in this mode; it must be alive until the
+  // device is unscheduled from it. While the device is open and not scheduled, reports are lost and errors are kept.
   virtual void scheduleWithRunLoop(RunLoop& runLoop, std::string_view mode) = 0;
   // The loop calls the receiver no more. Without effect on a device that is not scheduled there.
   virtual void unscheduleFromRunLoop(RunLoop& runLoop, std::string_view mode) = 0;

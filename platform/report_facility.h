@@ -67,7 +67,7 @@ class QUAZOR_EXPORT ReportSnapshot {
 
   // One sample per channel, in the facility's order.
   virtual const std::vector<ReportSample>& samples() const = 0;
-  // For every channel its value here minus its value in `baseline`, an earlier snapshot of the same set.
+  // For every channel its count here minus that in `baseline`, an earlier snapshot of the set: negative for a fall.
   virtual std::shared_ptr<const ReportSnapshot> snapshotWithBaseline(const ReportSnapshot& baseline,
                                                                      DiagnosticErrorPtr* error) const = 0;
 };
