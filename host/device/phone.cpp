@@ -7,6 +7,7 @@
 #include "backends/simulated/scenario/scenario.h"
 #include "backends/simulated/simulated_phone.h"
 #include "backends/threads/system_log.h"
+#include "base/json/json_cursor.h"
 #include "base/text/input_error.h"
 
 #include <optional>
@@ -50,34 +51,33 @@ class PhoneOfBinding final : public Phone {
   LinuxPhone phone_;
 };
 
-template <class Content>
-Content read(Content (*readFile)(const std::filesystem::path&), const std::filesystem::path& file) {
+// What `readIt` reads from the file.
+template <class Read>
+auto read(Read&& readIt, const std::filesystem::path& file) {
   try {
-    return readFile(file);
+    return readIt(file);
   } catch (const InputError& problem) {
     throw InputError(std::string("the simulated phone cannot be created: ") + problem.what());
   }
 }
 
-std::string_view nameOf(Expectation::Verdict verdict) {
-  switch (verdict) {
-    case Expectation::Verdict::kPass: return "pass";
-    case Expectation::Verdict::kFail: return "fail";
-    case Expectation::Verdict::kError: break;
-  }
-  return "error";
-}
+// A scenario file: the phone that it describes, and what runs on it should end in.
+struct ScenarioFile {
+  Scenario scenario;
+  std::vector<ExpectedOutcome> expected;
+};
 
-std::optional<ExpectedError> expected(const std::optional<FaultError>& error) {
-  if (!error) return std::nullopt;
-  return ExpectedError{error->domain, error->code, error->message};
+ScenarioFile readScenarioFile(const std::filesystem::path& file) {
+  Scenario scenario = readScenario(file);
+  std::vector<ExpectedOutcome> expected = readExpectedOutcomes(JsonCursor(*scenario.document));
+  return {std::move(scenario), std::move(expected)};
 }
 
 }  // namespace
 
 PhoneMaker phonesOfScenario(const std::filesystem::path& file, bool realTime, std::uint64_t seed) {
   const PhoneTime time = realTime ? PhoneTime::kReal : PhoneTime::kVirtual;
-  return [scenario = read(readScenario, file), time, seed] {
+  return [scenario = read(readScenarioFile, file).scenario, time, seed] {
     return std::make_unique<PhoneOfScenario>(scenario, time, seed);
   };
 }
@@ -104,24 +104,8 @@ std::shared_ptr<LogBackend> systemLogOfThisMachine() {
 }
 
 ScenarioSummary summaryOfScenario(const std::filesystem::path& file) {
-  const Scenario scenario = read(readScenario, file);
-  ScenarioSummary summary{scenario.title, {}, !scenario.faults.empty()};
-  for (const auto& [name, one] : scenario.expectations) {
-    ExpectedOutcome outcome{one.experiment ? one.experiment->name : name,
-                            one.experiment.has_value(),
-                            {},
-                            std::string(nameOf(one.verdict)),
-                            expected(one.error),
-                            expected(one.underlying),
-                            one.failedResults,
-                            std::nullopt};
-    if (one.experiment) {
-      outcome.parameters = one.experiment->parameters;
-      outcome.images = one.experiment->images;
-    }
-    summary.expected.push_back(std::move(outcome));
-  }
-  return summary;
+  ScenarioFile read = quazor::read(readScenarioFile, file);
+  return {read.scenario.title, std::move(read.expected), !read.scenario.faults.empty()};
 }
 
 }  // namespace quazor

@@ -2,7 +2,7 @@
 #pragma once
 
 #include "contract/log_channel.h"
-#include "contract/ordered_map.h"
+#include "host/device/expected_outcome.h"
 #include "platform/platform.h"
 
 #include <nlohmann/json.hpp>
@@ -46,25 +46,6 @@ using PhoneMaker = std::function<std::unique_ptr<Phone>()>;
 // `realTime`. One seed is one course of events in virtual time. Makes no phone itself. Throws a CommandError
 // (kCannotRead) with the reader's sentence when the file cannot be read.
 PhoneMaker phonesOfScenario(const std::filesystem::path& file, bool realTime, std::uint64_t seed);
-
-// The parts of an error that an outcome is expected to have.
-struct ExpectedError {
-  std::string domain;
-  std::int64_t code = 0;
-  std::string message;
-};
-
-// What a run on a phone is expected to end in.
-struct ExpectedOutcome {
-  std::string name;             // of the diagnostic, or of the experiment that is run alone
-  bool experimentOnly = false;  // then `parameters` are all that it is set up with
-  OrderedMap<double> parameters;
-  std::string verdict;                      // by its name
-  std::optional<ExpectedError> error;       // nothing: none, but for the host's own words
-  std::optional<ExpectedError> underlying;  // nothing: not looked at
-  std::vector<std::string> failedResults;
-  std::optional<std::uint64_t> images;  // how many the auxiliary data holds; nothing: not looked at
-};
 
 struct ScenarioSummary {
   std::string title;

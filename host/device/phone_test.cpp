@@ -80,6 +80,35 @@ TEST(PhonesOfScenario, RefusesAScenarioThatCannotBeRead) {
   }
 }
 
+TEST(ScenarioFiles, SayWhatIsExpected) {
+  const TestDirectory directory;
+  const ScenarioSummary summary = summaryOfScenario(directory.write("one.json", R"({
+    "title": "No camera", "cameras": {}, "groups": {}, "expect": {"D": {"verdict": "fail", "failedResults": ["R"]}}})"));
+  EXPECT_EQ(summary.title, "No camera");
+  EXPECT_FALSE(summary.hasFaults);
+  ASSERT_EQ(summary.expected.size(), 1U);
+  EXPECT_EQ(summary.expected[0].name, "D");
+  EXPECT_EQ(summary.expected[0].verdict, "fail");
+}
+
+TEST(ScenarioFiles, AreRefusedWithMalformedExpectations) {
+  const TestDirectory directory;
+  const std::filesystem::path file = directory.write("one.json", R"({
+    "title": "No camera", "cameras": {}, "groups": {}, "expect": {"D": {"verdict": "failed"}}})");
+  const auto problemOf = [](const auto& use) -> std::string {
+    try {
+      use();
+    } catch (const InputError& problem) {
+      return problem.what();
+    }
+    return "none";
+  };
+  const std::string due = "the simulated phone cannot be created: " + file.string() +
+                          ":2: expect.D.verdict: \"failed\" is not a verdict; did you mean \"fail\"?";
+  EXPECT_EQ(problemOf([&] { phonesOfScenario(file, false, 1); }), due);
+  EXPECT_EQ(problemOf([&] { summaryOfScenario(file); }), due);
+}
+
 TEST(BindingNamed, IsTheFileAfterThePrefix) {
   EXPECT_EQ(bindingNamed("linux:board.json"), "board.json");
   EXPECT_EQ(bindingNamed("linux:"), "");

@@ -6,17 +6,19 @@
 #include "backends/simulated/scenario/frame_config.h"
 #include "backends/simulated/scenario/hid_config.h"
 #include "backends/simulated/scenario/report_config.h"
-#include "contract/ordered_map.h"
 #include "contract/value.h"
 
 #include <cstdint>
 #include <filesystem>
+#include <memory>
 #include <optional>
 #include <set>
 #include <string>
 #include <vector>
 
 namespace quazor {
+
+class JsonDocument;
 
 // Frame rates, in frames per second, are kept to a millionth and are at most this.
 inline constexpr double kMaxFrameRate = 1000;
@@ -60,24 +62,6 @@ struct CaptureDeviceConfig {
   bool present = true;      // false: the plug-in finds no device
 };
 
-// An experiment that is run alone.
-struct ExperimentRun {
-  std::string name;
-  OrderedMap<double> parameters;
-  std::optional<std::uint64_t> images;  // how many its result holds; nothing: not looked at
-};
-
-// What a run on the phone is to end in.
-struct Expectation {
-  enum class Verdict { kPass, kFail, kError };
-
-  std::optional<ExperimentRun> experiment;  // nothing: a diagnostic is run
-  Verdict verdict = Verdict::kPass;
-  std::optional<FaultError> error;         // nothing: the run gives no error
-  std::optional<FaultError> underlying;    // nothing: that error has no underlying one
-  std::vector<std::string> failedResults;  // the names of the measured results outside their limits
-};
-
 struct Scenario {
   std::string title;
   CaptureDeviceConfig device;
@@ -87,7 +71,9 @@ struct Scenario {
   std::vector<HidDeviceConfig> hidDevices;
   DisplayConfig display;
   std::vector<Fault> faults;
-  OrderedMap<Expectation> expectations;  // by the diagnostic's name, or any name of a run of an experiment
+  // The file's document, with its base merged in, for the key that no phone reads: `expect`, what runs should end in.
+  // Null for a scenario that is in no file.
+  std::shared_ptr<const JsonDocument> document;
 };
 
 // Reads a scenario file and the files it is based on. Throws InputError, one sentence without a line end: the

@@ -123,13 +123,6 @@ CameraGroup readGroup(const std::string& id, const JsonCursor& cursor, const Sce
   return group;
 }
 
-// Nothing for an entry that is missing or null.
-std::optional<FaultError> readOptionalError(const JsonCursor& object, std::string_view key) {
-  const std::optional<JsonCursor> entry = object.find(key);
-  if (!entry || entry->isNull()) return std::nullopt;
-  return readFaultError(*entry);
-}
-
 FaultTargets targetsOf(const Scenario& scenario) {
   FaultTargets targets;
   for (const Camera& camera : scenario.cameras) targets.streams.push_back(camera.id);
@@ -145,51 +138,6 @@ FaultTargets targetsOf(const Scenario& scenario) {
   }
   for (const auto& [name, value] : scenario.display.properties) targets.registryProperties->push_back(name);
   return targets;
-}
-
-ExperimentRun readExperimentRun(const JsonCursor& cursor) {
-  ExperimentRun run;
-  run.name = cursor.at("experiment").text();
-  if (const auto parameters = cursor.find("parameters")) {
-    constexpr double kMaximum = std::numeric_limits<double>::max();
-    for (const auto& [name, value] : parameters->entries()) run.parameters.set(name, value.number(-kMaximum, kMaximum));
-  }
-  if (const auto images = cursor.find("images")) run.images = images->integer(0, kMaxFrames);
-  return run;
-}
-
-void checkExperimentRun(const Expectation& expectation, const JsonCursor& cursor) {
-  if (!expectation.experiment) {
-    if (cursor.find("parameters")) cursor.fail("only a run of an experiment has parameters; name the \"experiment\".");
-    if (cursor.find("images")) cursor.fail("only a run of an experiment has images; name the \"experiment\".");
-    return;
-  }
-  if (expectation.verdict == Expectation::Verdict::kFail) {
-    cursor.fail("nobody judges an experiment that is run alone: it passes or ends in an error.");
-  }
-  if (expectation.experiment->images && expectation.verdict != Expectation::Verdict::kPass) {
-    cursor.fail("only the verdict \"pass\" has images.");
-  }
-}
-
-Expectation readExpectation(const JsonCursor& cursor) {
-  constexpr std::array<std::string_view, 3> kVerdicts{"pass", "fail", "error"};
-  cursor.allowKeys({"experiment", "parameters", "verdict", "error", "underlying", "failedResults", "images"});
-  Expectation expectation;
-  const std::string verdict = cursor.at("verdict").oneOf(kVerdicts, "a verdict");
-  if (verdict == "fail") expectation.verdict = Expectation::Verdict::kFail;
-  if (verdict == "error") expectation.verdict = Expectation::Verdict::kError;
-  expectation.error = readOptionalError(cursor, "error");
-  expectation.underlying = readOptionalError(cursor, "underlying");
-  if (expectation.error && verdict != "error") cursor.fail("only the verdict \"error\" has an error.");
-  if (expectation.underlying && !expectation.error) cursor.fail("an underlying error needs an error above it.");
-  if (const auto results = cursor.find("failedResults")) {
-    if (verdict != "fail") results->fail("only the verdict \"fail\" has failed results.");
-    for (const JsonCursor& result : results->elements()) expectation.failedResults.push_back(result.text());
-  }
-  if (cursor.find("experiment")) expectation.experiment = readExperimentRun(cursor);
-  checkExperimentRun(expectation, cursor);
-  return expectation;
 }
 
 }  // namespace
@@ -216,11 +164,6 @@ Scenario scenarioOf(const JsonCursor& document) {
   }
   if (const auto display = document.find("display")) scenario.display = readDisplay(*display);
   if (const auto faults = document.find("faults")) scenario.faults = readFaults(*faults, targetsOf(scenario));
-  if (const auto expect = document.find("expect")) {
-    for (const auto& [name, expectation] : expect->entries()) {
-      scenario.expectations.set(name, readExpectation(expectation));
-    }
-  }
   return scenario;
 }
 

@@ -6,7 +6,8 @@
 
 namespace quazor {
 
-// The scenario that a document describes, its "base" already merged in. Throws InputError, "PATH: ...".
+// The scenario that a document describes, its "base" already merged in; its `expect` is not read. Throws InputError,
+// "PATH: ...".
 Scenario scenarioOf(const JsonCursor& document);
 
 }  // namespace quazor

@@ -26,10 +26,6 @@ std::string withEntry(std::string_view entry) {
 std::string withFaultEntries(std::string_view entries) {
   return withEntry(R"("faults": [{"action": "fail", )" + std::string(entries) + "}]");
 }
-std::string withExpectedEntries(std::string_view entries) {
-  return withEntry(R"("expect": {"E": {)" + std::string(entries) + "}}");
-}
-
 Scenario read(const std::string& text) {
   const Json document = Json::parse(text);
   return scenarioOf(JsonCursor(document));
@@ -103,46 +99,6 @@ TEST(ScenarioContentTest, FaultsThatWouldNeverFireAreRefused) {
        "faults[0].property: HidDevice.open is about no property; leave it out."},
   };
   for (const auto& row : kRows) EXPECT_EQ(problemOf(withFaultEntries(row.entries)), row.problem) << row.name;
-}
-
-TEST(ScenarioContentTest, ARunOfAnExperimentIsRead) {
-  const Scenario scenario = read(withExpectedEntries(
-      R"("experiment": "X", "parameters": {"images": 5, "timeout": -0.5}, "verdict": "pass", "images": 6)"));
-  const Expectation& expectation = *scenario.expectations.find("E");
-  ASSERT_TRUE(expectation.experiment);
-  EXPECT_EQ(expectation.experiment->name, "X");
-  EXPECT_EQ(expectation.experiment->parameters, (OrderedMap<double>{{"images", 5.0}, {"timeout", -0.5}}));
-  EXPECT_EQ(expectation.experiment->images, 6U);
-  EXPECT_EQ(expectation.verdict, Expectation::Verdict::kPass);
-  const Scenario bare = read(withExpectedEntries(R"("experiment": "X", "verdict": "error")"));
-  EXPECT_EQ(bare.expectations.find("E")->experiment->images, std::nullopt);
-  EXPECT_TRUE(bare.expectations.find("E")->experiment->parameters.empty());
-  const Scenario diagnostic = read(withExpectedEntries(R"("verdict": "pass")"));
-  EXPECT_EQ(diagnostic.expectations.find("E")->experiment.has_value(), false);
-}
-
-TEST(ScenarioContentTest, RunsOfExperimentsThatContradictThemselvesAreRefused) {
-  const struct {
-    const char* name;
-    const char* entries;
-    const char* problem;
-  } kRows[] = {
-      {"parameters of a diagnostic", R"("verdict": "pass", "parameters": {})",
-       "expect.E: only a run of an experiment has parameters; name the \"experiment\"."},
-      {"images of a diagnostic", R"("verdict": "pass", "images": 1)",
-       "expect.E: only a run of an experiment has images; name the \"experiment\"."},
-      {"a judgement", R"("experiment": "X", "verdict": "fail")",
-       "expect.E: nobody judges an experiment that is run alone: it passes or ends in an error."},
-      {"images of an error", R"("experiment": "X", "verdict": "error", "images": 1)",
-       "expect.E: only the verdict \"pass\" has images."},
-      {"a parameter that is no number", R"("experiment": "X", "verdict": "pass", "parameters": {"p": "5"})",
-       "expect.E.parameters.p: must be a number from -1.7976931348623157e+308 to 1.7976931348623157e+308, not \"5\"."},
-      {"a negative count of images", R"("experiment": "X", "verdict": "pass", "images": -1)",
-       "expect.E.images: must be an integer from 0 to 1000000000, not -1."},
-      {"an experiment without a name", R"("experiment": "", "verdict": "pass")",
-       "expect.E.experiment: must be a string that is not empty, not \"\"."},
-  };
-  for (const auto& row : kRows) EXPECT_EQ(problemOf(withExpectedEntries(row.entries)), row.problem) << row.name;
 }
 
 }  // namespace

@@ -3,6 +3,7 @@
 #include "base/text/input_error.h"
 
 #include <algorithm>
+#include <memory>
 #include <system_error>
 #include <utility>
 #include <vector>
@@ -13,22 +14,19 @@ namespace {
 using Json = nlohmann::ordered_json;
 namespace fs = std::filesystem;
 
-struct Loaded {
-  Json document;  // with its base merged in
-  Scenario scenario;
-};
-
 // One file and its bases. A base is a whole scenario itself, so that what is wrong with it is found there and not in
 // the files that build on it. `open_` are the files on the way here; none of them may be a base again.
 //
 // Thread: one at a time
 class Loader {
  public:
-  Loaded load(const fs::path& file) {
-    JsonDocument document = JsonDocument::read(file);
-    if (document.value().is_object() && document.value().contains("base")) document.setValue(merged(document, file));
-    Scenario scenario = scenarioOf(JsonCursor(document));
-    return {document.value(), std::move(scenario)};
+  Scenario load(const fs::path& file) {
+    auto document = std::make_shared<JsonDocument>(JsonDocument::read(file));
+    if (document->value().is_object() && document->value().contains("base"))
+      document->setValue(merged(*document, file));
+    Scenario scenario = scenarioOf(JsonCursor(*document));
+    scenario.document = std::move(document);
+    return scenario;
   }
 
  private:
@@ -49,7 +47,7 @@ class Loader {
 
   Json loadBase(const fs::path& file, const JsonCursor& base) {
     try {
-      return load(file).document;
+      return load(file).document->value();
     } catch (const InputError& problem) {
       base.fail(problem.what());
     }
@@ -67,6 +65,6 @@ class Loader {
 
 }  // namespace
 
-Scenario readScenario(const fs::path& file) { return Loader().load(file).scenario; }
+Scenario readScenario(const fs::path& file) { return Loader().load(file); }
 
 }  // namespace quazor

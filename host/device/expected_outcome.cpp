@@ -1,0 +1,73 @@
+#include "host/device/expected_outcome.h"
+
+#include "base/json/json_cursor.h"
+
+#include <array>
+#include <limits>
+#include <string_view>
+#include <utility>
+
+namespace quazor {
+
+namespace {
+
+constexpr std::uint64_t kMaxImages = 1'000'000'000;
+
+// Nothing for an entry that is missing or null.
+std::optional<ExpectedError> readExpectedError(const JsonCursor& outcome, std::string_view key) {
+  const std::optional<JsonCursor> error = outcome.find(key);
+  if (!error || error->isNull()) return std::nullopt;
+  error->allowKeys({"domain", "code", "message"});
+  return ExpectedError{error->at("domain").text(), error->at("code").integer(), error->at("message").text()};
+}
+
+void readExperimentRun(const JsonCursor& cursor, ExpectedOutcome& outcome) {
+  outcome.name = cursor.at("experiment").text();
+  outcome.experimentOnly = true;
+  if (const auto parameters = cursor.find("parameters")) {
+    constexpr double kMaximum = std::numeric_limits<double>::max();
+    for (const auto& [name, value] : parameters->entries()) {
+      outcome.parameters.set(name, value.number(-kMaximum, kMaximum));
+    }
+  }
+  if (const auto images = cursor.find("images")) outcome.images = images->integer(0, kMaxImages);
+  if (outcome.verdict == "fail") {
+    cursor.fail("nobody judges an experiment that is run alone: it passes or ends in an error.");
+  }
+  if (outcome.images && outcome.verdict != "pass") cursor.fail("only the verdict \"pass\" has images.");
+}
+
+ExpectedOutcome readOutcome(const std::string& name, const JsonCursor& cursor) {
+  constexpr std::array<std::string_view, 3> kVerdicts{"pass", "fail", "error"};
+  cursor.allowKeys({"experiment", "parameters", "verdict", "error", "underlying", "failedResults", "images"});
+  ExpectedOutcome outcome;
+  outcome.name = name;
+  outcome.verdict = cursor.at("verdict").oneOf(kVerdicts, "a verdict");
+  outcome.error = readExpectedError(cursor, "error");
+  outcome.underlying = readExpectedError(cursor, "underlying");
+  if (outcome.error && outcome.verdict != "error") cursor.fail("only the verdict \"error\" has an error.");
+  if (outcome.underlying && !outcome.error) cursor.fail("an underlying error needs an error above it.");
+  if (const auto results = cursor.find("failedResults")) {
+    if (outcome.verdict != "fail") results->fail("only the verdict \"fail\" has failed results.");
+    for (const JsonCursor& result : results->elements()) outcome.failedResults.push_back(result.text());
+  }
+  if (cursor.find("experiment")) {
+    readExperimentRun(cursor, outcome);
+    return outcome;
+  }
+  if (cursor.find("parameters")) cursor.fail("only a run of an experiment has parameters; name the \"experiment\".");
+  if (cursor.find("images")) cursor.fail("only a run of an experiment has images; name the \"experiment\".");
+  return outcome;
+}
+
+}  // namespace
+
+std::vector<ExpectedOutcome> readExpectedOutcomes(const JsonCursor& scenario) {
+  std::vector<ExpectedOutcome> outcomes;
+  const std::optional<JsonCursor> expect = scenario.find("expect");
+  if (!expect) return outcomes;
+  for (const auto& [name, outcome] : expect->entries()) outcomes.push_back(readOutcome(name, outcome));
+  return outcomes;
+}
+
+}  // namespace quazor
