@@ -14,6 +14,36 @@ Platform& currentPlatform() {
 
 }  // namespace
 
+// Of the services that have nothing else to define: their tables of virtual functions are in this library alone.
+
+CaptureObject::~CaptureObject() = default;
+CaptureStream::~CaptureStream() = default;
+SynchronizedStreamsGroup::~SynchronizedStreamsGroup() = default;
+CaptureDevice::~CaptureDevice() = default;
+CapturePlugIn::~CapturePlugIn() = default;
+CaptureService::~CaptureService() = default;
+
+SerialQueue::~SerialQueue() = default;
+Semaphore::~Semaphore() = default;
+Concurrency::~Concurrency() = default;
+
+RegistryService::~RegistryService() = default;
+Display::~Display() = default;
+FramebufferService::~FramebufferService() = default;
+
+HidDevice::~HidDevice() = default;
+HidManager::~HidManager() = default;
+HidService::~HidService() = default;
+
+ReportSnapshot::~ReportSnapshot() = default;
+ReportChannelSet::~ReportChannelSet() = default;
+ReportFacility::~ReportFacility() = default;
+
+RunLoopSource::~RunLoopSource() = default;
+RunLoopObserver::~RunLoopObserver() = default;
+RunLoop::~RunLoop() = default;
+RunLoops::~RunLoops() = default;
+
 void installPlatform(Platform platform) { currentPlatform() = std::move(platform); }
 
 const Platform& installedPlatform() { return currentPlatform(); }
