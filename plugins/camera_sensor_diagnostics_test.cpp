@@ -3,6 +3,7 @@
 #include "backends/simulated/simulated_phone.h"
 #include "contract/lab.h"
 #include "platform/platform.h"
+#include "tests/support/shipped_scenario.h"
 
 #include <dlfcn.h>
 
@@ -52,21 +53,19 @@ const struct Row {
      "CameraSyncExperiment.Front", "CameraSyncAnalysis.Front"},
 };
 
-Scenario healthyPhone() { return readScenario(QUAZOR_SCENARIOS "/healthy.json"); }
-
 class Catalogue : public ::testing::Test {
  protected:
   // The plug-in registers in this process's lab, once, and stays loaded.
   static void SetUpTestSuite() {
     registeredBefore = QZLab::defaultLab().registrations().size();
     ASSERT_NE(dlopen(QUAZOR_PLUGIN, RTLD_NOW | RTLD_LOCAL), nullptr) << dlerror();
-    Platform platform = SimulatedPhone(healthyPhone(), PhoneTime::kVirtual, 0).platform();
+    Platform platform = SimulatedPhone(shippedScenario("healthy"), PhoneTime::kVirtual, 0).platform();
     installPlatform(std::move(platform));
   }
 
   // Runs a camera experiment and returns what it set, as "object KEY = value", for one property.
   static std::vector<std::string> settingsOf(std::string_view experiment, std::string_view property) {
-    SimulatedPhone phone(healthyPhone(), PhoneTime::kVirtual, 0);
+    SimulatedPhone phone(shippedScenario("healthy"), PhoneTime::kVirtual, 0);
     std::vector<std::string> settings;
     phone.observeCalls([&](const PlatformCall& call) {
       if (call.detail.starts_with(std::string(property) + " = ")) settings.push_back(call.object + ' ' + call.detail);
@@ -116,7 +115,7 @@ TEST_F(Catalogue, MakesANewInstanceOnEveryCall) {
 TEST_F(Catalogue, GivesEveryExperimentAndAnalysisOfAGroupTheSamePorts) {
   for (const std::string_view group : {"Back", "Front"}) {
     const std::string suffix = "." + std::string(group);
-    SimulatedPhone phone(healthyPhone(), PhoneTime::kVirtual, 0);
+    SimulatedPhone phone(shippedScenario("healthy"), PhoneTime::kVirtual, 0);
     const Platform before = installedPlatform();
     installPlatform(phone.platform());
     QZLab& lab = QZLab::defaultLab();

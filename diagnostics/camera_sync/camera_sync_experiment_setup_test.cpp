@@ -133,7 +133,7 @@ TEST_F(CameraSyncExperimentSetup, KeepsNothingOfTheCaptureServiceAfterItsRun) {
   EXPECT_TRUE(service->lastPlugIn.expired());
 
   // What the fakes hold of each other goes first; the experiment still stands, with its platform.
-  service->forgetDevice();
+  service->device.reset();
   device->groups.clear();
   device->properties = {};
   group->properties = {};

@@ -30,7 +30,7 @@ QZExperimentResult resultOfSoundRun() {
 // A run's results as text: the module's channels without events, then `frames`, then the counters without errors.
 std::string soundResults(const std::string& frames) {
   std::string text;
-  for (const std::string_view name : kModuleChannels) {
+  for (const std::string_view name : moduleChannels()) {
     text += std::string(name) + " = 0 events [Limit: 0 events closed to 0 events closed]\n";
   }
   return text + frames +
@@ -244,7 +244,7 @@ TEST(TesselFaultAnalysis, DoesNotJudgeTheOtherErrorCounters) {
 }
 
 TEST(TesselFaultAnalysis, FailsWhenAnyOneOfTheChannelsIsMissing) {
-  for (const std::string_view name : kModuleChannels) {
+  for (const std::string_view name : moduleChannels()) {
     QZExperimentResult run = resultOfSoundRun();
     ASSERT_TRUE(run.measurements().erase(name));
     DiagnosticErrorPtr error = earlierError();

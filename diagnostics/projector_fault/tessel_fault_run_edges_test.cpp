@@ -3,6 +3,7 @@
 
 #include "backends/simulated/simulated_phone.h"
 #include "platform/capture_keys.h"
+#include "tests/support/scripted_capture.h"
 #include "tests/sweeps/projector_bench.h"
 
 #include <gtest/gtest.h>
@@ -110,87 +111,27 @@ TEST_F(TesselFaultRunEdges, ReplacesTheErrorOfAStreamWithoutAPortWhenItFails) {
       << told;
 }
 
-// A stream that leaves an error behind with every success, and fails without one at `refusedKey`.
-class MisleadingStream final : public CaptureStream {
- public:
-  explicit MisleadingStream(std::string refusedKey) : refusedKey_(std::move(refusedKey)) {}
-
-  std::string description() const override { return "misleading stream"; }
-  std::optional<Value> valueForProperty(std::string_view key, DiagnosticErrorPtr* error) override {
-    mislead(error);
-    if (key == capture_key::PortType) return Value(port_type::FrontFacingInfraredCamera);
-    return Value(Dictionary{});
-  }
-  bool setValue(const Value& /*value*/, std::string_view key, DiagnosticErrorPtr* error) override {
-    if (key == refusedKey_) return false;
-    mislead(error);
-    return true;
-  }
-  bool start(DiagnosticErrorPtr* error) override {
-    if (refusedKey_ == "start") return false;
-    mislead(error);
-    return true;
-  }
-  bool stop(DiagnosticErrorPtr* error) override {
-    EXPECT_EQ(error, nullptr);
-    return true;
-  }
-
- private:
-  static void mislead(DiagnosticErrorPtr* error) {
-    if (error != nullptr) {
-      EXPECT_EQ(*error, nullptr) << "a call was given a place that still holds an error";
+// A service whose calls leave an error behind with every success and none with a failure; its stream refuses a
+// property, or to start.
+std::shared_ptr<CaptureService> makeMisleadingCapture(const std::string& refused) {
+  const CaptureScript mislead = [](const ScriptedCall& call) {
+    if (call.operation == "stop") {
+      EXPECT_EQ(call.error, nullptr);
     }
-    storeError(error, makeError("MisleadingDomain", 1, "All went well."));
-  }
-
-  std::string refusedKey_;
-};
-
-class MisleadingDevice final : public CaptureDevice {
- public:
-  explicit MisleadingDevice(std::shared_ptr<CaptureStream> stream) : stream_(std::move(stream)) {}
-
-  std::string description() const override { return "misleading device"; }
-  std::optional<Value> valueForProperty(std::string_view, DiagnosticErrorPtr*) override { return std::nullopt; }
-  bool setValue(const Value&, std::string_view, DiagnosticErrorPtr*) override { return false; }
-  std::optional<CaptureStreams> streams(DiagnosticErrorPtr* error) override {
-    storeError(error, makeError("MisleadingDomain", 2, "All went well."));
-    return CaptureStreams{stream_};
-  }
-  std::optional<SynchronizedStreamsGroups> synchronizedStreamsGroups(DiagnosticErrorPtr*) override {
-    return std::nullopt;
-  }
-  bool requestControlOfStreams(const CaptureStreams&, DiagnosticErrorPtr* error) override {
-    storeError(error, makeError("MisleadingDomain", 3, "All went well."));
-    return true;
-  }
-  bool relinquishControlOfStreams(const CaptureStreams&, DiagnosticErrorPtr*) override { return false; }
-  bool invalidate(DiagnosticErrorPtr*) override { return true; }
-
- private:
-  std::shared_ptr<CaptureStream> stream_;
-};
-
-class MisleadingCapture final : public CaptureService, public CapturePlugIn {
- public:
-  explicit MisleadingCapture(std::string refusedKey)
-      : device_(std::make_shared<MisleadingDevice>(std::make_shared<MisleadingStream>(std::move(refusedKey)))) {}
-
-  std::string description() const override { return "misleading plug-in"; }
-  std::shared_ptr<CapturePlugIn> createPlugIn() override { return nullptr; }
-  // This very object, which the platform keeps.
-  std::shared_ptr<CapturePlugIn> defaultPlugIn() override {
-    return std::shared_ptr<CapturePlugIn>(std::shared_ptr<void>(), this);
-  }
-  std::shared_ptr<CaptureDevice> device(DiagnosticErrorPtr* error) override {
-    storeError(error, makeError("MisleadingDomain", 4, "All went well."));
-    return device_;
-  }
-
- private:
-  std::shared_ptr<CaptureDevice> device_;
-};
+    if (call.error != nullptr) {
+      EXPECT_EQ(*call.error, nullptr) << "a call was given a place that still holds an error";
+    }
+    if (call.succeeds) storeError(call.error, makeError("MisleadingDomain", 1, "All went well."));
+    return call.succeeds;
+  };
+  auto stream = std::make_shared<ScriptedStream>("stream", mislead);
+  stream->properties.set(capture_key::PortType, port_type::FrontFacingInfraredCamera);
+  stream->properties.set(capture_key::ErrorCounters, Dictionary());
+  stream->refused = {refused};
+  auto device = std::make_shared<ScriptedDevice>("device", mislead);
+  device->members = CaptureStreams{std::move(stream)};
+  return std::make_shared<ScriptedCapture>(std::move(device), mislead);
+}
 
 TEST_F(TesselFaultRunEdges, BlamesNoErrorOfACallThatWentWell) {
   const struct {
@@ -214,7 +155,7 @@ TEST_F(TesselFaultRunEdges, BlamesNoErrorOfACallThatWentWell) {
   for (const auto& row : rows) {
     SCOPED_TRACE(row.refused);
     Platform platform = phone.platform();
-    platform.capture = std::make_shared<MisleadingCapture>(row.refused);
+    platform.capture = makeMisleadingCapture(row.refused);
     const auto experiment = std::make_shared<QZTesselFaultExperiment>(platform);
     expectContains(run(*experiment), row.told);
   }

@@ -3,6 +3,7 @@
 
 #include "diagnostics/projector_fault/fixed_clock_for_tests.h"
 #include "diagnostics/report_channels/expectations_for_tests.h"
+#include "tests/support/scripted_capture.h"
 
 #include <gmock/gmock.h>
 #include <gtest/gtest.h>
@@ -78,23 +79,6 @@ class FakeConcurrency final : public Concurrency {
   std::shared_ptr<Calls> calls_;
 };
 
-class FakeCaptureService final : public CaptureService {
- public:
-  explicit FakeCaptureService(std::shared_ptr<Calls> calls) : calls_(std::move(calls)) {}
-
-  std::shared_ptr<CapturePlugIn> createPlugIn() override {
-    calls_->push_back("createPlugIn");
-    return nullptr;
-  }
-  std::shared_ptr<CapturePlugIn> defaultPlugIn() override {
-    calls_->push_back("defaultPlugIn");
-    return nullptr;
-  }
-
- private:
-  std::shared_ptr<Calls> calls_;
-};
-
 class FakeReportFacility final : public ReportFacility {
  public:
   explicit FakeReportFacility(std::shared_ptr<Calls> calls) : calls_(std::move(calls)) {}
@@ -103,74 +87,6 @@ class FakeReportFacility final : public ReportFacility {
     calls_->push_back("reportWithOnlySimpleChannels");
     return nullptr;
   }
-
- private:
-  std::shared_ptr<Calls> calls_;
-};
-
-class FakeStream final : public CaptureStream {
- public:
-  explicit FakeStream(std::shared_ptr<Calls> calls) : calls_(std::move(calls)) {}
-
-  std::string description() const override { return "stream"; }
-  std::optional<Value> valueForProperty(std::string_view key, DiagnosticErrorPtr* /*error*/) override {
-    calls_->push_back("stream's " + std::string(key));
-    return std::nullopt;
-  }
-  bool setValue(const Value& /*value*/, std::string_view key, DiagnosticErrorPtr* /*error*/) override {
-    calls_->push_back("set stream's " + std::string(key));
-    return false;
-  }
-  bool start(DiagnosticErrorPtr* /*error*/) override {
-    calls_->push_back("start");
-    return false;
-  }
-  bool stop(DiagnosticErrorPtr* /*error*/) override {
-    calls_->push_back("stop");
-    return false;
-  }
-
- private:
-  std::shared_ptr<Calls> calls_;
-};
-
-class FakeDevice final : public CaptureDevice {
- public:
-  explicit FakeDevice(std::shared_ptr<Calls> calls) : calls_(std::move(calls)) {}
-
-  std::string description() const override { return "device"; }
-  std::optional<Value> valueForProperty(std::string_view key, DiagnosticErrorPtr* /*error*/) override {
-    calls_->push_back("device's " + std::string(key));
-    return std::nullopt;
-  }
-  bool setValue(const Value& /*value*/, std::string_view key, DiagnosticErrorPtr* /*error*/) override {
-    calls_->push_back("set device's " + std::string(key));
-    return false;
-  }
-  std::optional<CaptureStreams> streams(DiagnosticErrorPtr* /*error*/) override {
-    calls_->push_back("streams");
-    return std::nullopt;
-  }
-  std::optional<SynchronizedStreamsGroups> synchronizedStreamsGroups(DiagnosticErrorPtr* /*error*/) override {
-    calls_->push_back("synchronizedStreamsGroups");
-    return std::nullopt;
-  }
-  bool requestControlOfStreams(const CaptureStreams& /*streams*/, DiagnosticErrorPtr* /*error*/) override {
-    calls_->push_back("requestControlOfStreams");
-    return false;
-  }
-  bool relinquishControlOfStreams(const CaptureStreams& /*streams*/, DiagnosticErrorPtr* /*error*/) override {
-    calls_->push_back("relinquishControlOfStreams");
-    return false;
-  }
-  bool invalidate(DiagnosticErrorPtr* error) override {
-    calls_->push_back("invalidate");
-    if (invalidateError != nullptr) storeError(error, invalidateError);
-    return invalidates;
-  }
-
-  bool invalidates = true;
-  DiagnosticErrorPtr invalidateError;  // stored by invalidate(), however it ends
 
  private:
   std::shared_ptr<Calls> calls_;
@@ -185,16 +101,24 @@ class TesselFaultExperimentSetup : public testing::Test {
   std::shared_ptr<QZTesselFaultExperiment> makeOpenExperiment() const {
     auto experiment = makeExperiment();
     experiment->setDevice(device);
-    experiment->setStream(std::make_shared<FakeStream>(calls));
+    experiment->setStream(std::make_shared<ScriptedStream>("stream", script));
     calls->clear();
     return experiment;
   }
 
   const std::shared_ptr<Calls> calls = std::make_shared<Calls>();
+  bool invalidates = true;
+  DiagnosticErrorPtr invalidateError;  // stored by invalidate(), however it ends
+  const CaptureScript script = [this](const ScriptedCall& call) {
+    calls->push_back(std::string(call.operation));
+    if (call.operation != "invalidate") return false;
+    if (invalidateError != nullptr) storeError(call.error, invalidateError);
+    return invalidates;
+  };
   const std::shared_ptr<FakeConcurrency> concurrency = std::make_shared<FakeConcurrency>(calls);
-  const Platform platform{std::make_shared<FakeCaptureService>(calls), std::make_shared<FixedClock>(), concurrency,
-                          std::make_shared<FakeReportFacility>(calls)};
-  const std::shared_ptr<FakeDevice> device = std::make_shared<FakeDevice>(calls);
+  const Platform platform{std::make_shared<ScriptedCapture>(nullptr, script), std::make_shared<FixedClock>(),
+                          concurrency, std::make_shared<FakeReportFacility>(calls)};
+  const std::shared_ptr<ScriptedDevice> device = std::make_shared<ScriptedDevice>("device", script);
   const DiagnosticErrorPtr earlier = earlierError();
   const DiagnosticErrorPtr deviceError = makeError("DeviceErrorDomain", -3, "The device is gone.");
 };
@@ -237,7 +161,7 @@ TEST_F(TesselFaultExperimentSetup, UsesTheInstalledPlatformUnlessHandedAnother) 
 
 TEST_F(TesselFaultExperimentSetup, SetsItsProperties) {
   const auto experiment = makeExperiment();
-  const auto stream = std::make_shared<FakeStream>(calls);
+  const auto stream = std::make_shared<ScriptedStream>("stream", script);
   experiment->setPort("BackFacingCamera");
   EXPECT_EQ(experiment->port(), "BackFacingCamera");
   experiment->setFormatIndex(std::numeric_limits<std::uint64_t>::max());
@@ -254,10 +178,10 @@ TEST_F(TesselFaultExperimentSetup, SetsItsProperties) {
 
 TEST_F(TesselFaultExperimentSetup, OwnsWhatItHoldsUntilItGoes) {
   auto experiment = makeExperiment();
-  auto heldDevice = std::make_shared<FakeDevice>(calls);
-  auto heldStream = std::make_shared<FakeStream>(calls);
-  const std::weak_ptr<FakeDevice> weakDevice = heldDevice;
-  const std::weak_ptr<FakeStream> weakStream = heldStream;
+  auto heldDevice = std::make_shared<ScriptedDevice>("device", script);
+  auto heldStream = std::make_shared<ScriptedStream>("stream", script);
+  const std::weak_ptr<ScriptedDevice> weakDevice = heldDevice;
+  const std::weak_ptr<ScriptedStream> weakStream = heldStream;
   experiment->setDevice(std::move(heldDevice));
   experiment->setStream(std::move(heldStream));
   ASSERT_EQ(concurrency->made.size(), 3U);
@@ -373,8 +297,8 @@ TEST_F(TesselFaultExperimentSetup, InvalidatesTheDeviceInItsTeardownAndDoesNothi
 }
 
 TEST_F(TesselFaultExperimentSetup, FailsItsTeardownWithTheDevicesErrorWhereItGaveOne) {
-  device->invalidates = false;
-  device->invalidateError = deviceError;
+  invalidates = false;
+  invalidateError = deviceError;
   DiagnosticErrorPtr error = earlier;
   EXPECT_FALSE(makeOpenExperiment()->teardown(&error));
   EXPECT_EQ(told(error),
@@ -386,7 +310,7 @@ TEST_F(TesselFaultExperimentSetup, FailsItsTeardownWithTheDevicesErrorWhereItGav
 
 // What the caller's place held before caused nothing.
 TEST_F(TesselFaultExperimentSetup, FailsItsTeardownWithoutAnUnderlyingErrorWhereTheDeviceGaveNone) {
-  device->invalidates = false;
+  invalidates = false;
   DiagnosticErrorPtr error = earlier;
   EXPECT_FALSE(makeOpenExperiment()->teardown(&error));
   EXPECT_EQ(told(error), "QZCapturePlugInErrorDomain 200 Failed to invalidate the capture device.");
@@ -401,16 +325,16 @@ TEST_F(TesselFaultExperimentSetup, FailsItsTeardownWithoutADevice) {
 }
 
 TEST_F(TesselFaultExperimentSetup, FailsItsTeardownJustSoForACallerThatWantsNoError) {
-  device->invalidates = false;
-  device->invalidateError = deviceError;
+  invalidates = false;
+  invalidateError = deviceError;
   EXPECT_FALSE(makeOpenExperiment()->teardown(nullptr));
   EXPECT_THAT(*calls, ElementsAre("invalidate"));
-  device->invalidates = true;
+  invalidates = true;
   EXPECT_TRUE(makeOpenExperiment()->teardown(nullptr));
 }
 
 TEST_F(TesselFaultExperimentSetup, SucceedsInItsTeardownWhenTheDeviceGaveAnErrorAndSuccess) {
-  device->invalidateError = deviceError;
+  invalidateError = deviceError;
   DiagnosticErrorPtr error = earlier;
   EXPECT_TRUE(makeOpenExperiment()->teardown(&error));
   EXPECT_EQ(error, earlier);

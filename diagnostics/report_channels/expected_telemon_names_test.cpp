@@ -5,6 +5,7 @@
 #include <gmock/gmock.h>
 #include <gtest/gtest.h>
 
+#include <cstdint>
 #include <set>
 #include <string_view>
 #include <vector>
@@ -13,7 +14,23 @@ namespace quazor {
 namespace {
 
 TEST(ExpectedTelemonNames, AreTheChannelsOfTheModuleInTheirOrder) {
-  EXPECT_THAT(expectedTelemonNames(), testing::ElementsAreArray(kModuleChannels));
+  EXPECT_THAT(expectedTelemonNames(), testing::ElementsAreArray(moduleChannels()));
+}
+
+// FNV-1a of the names, each followed by a newline.
+std::uint64_t digestOf(const std::vector<std::string_view>& names) {
+  std::uint64_t digest = 0xCBF29CE484222325;
+  const auto add = [&digest](char unit) { digest = (digest ^ static_cast<unsigned char>(unit)) * 0x100000001B3; };
+  for (const std::string_view name : names) {
+    for (const char unit : name) add(unit);
+    add('\n');
+  }
+  return digest;
+}
+
+// The list and the healthy phone agree on a slip that was made in both; the digest is of neither.
+TEST(ExpectedTelemonNames, HaveTheDigestOfTheModulesNames) {
+  EXPECT_EQ(digestOf(expectedTelemonNames()), 0x50B3B86CB83EA2A2U);
 }
 
 TEST(ExpectedTelemonNames, AreSixtyDifferentOnes) {

@@ -14,7 +14,7 @@ namespace {
 // The results of a quiet module, as text.
 std::string quietResults() {
   std::string text;
-  for (const std::string_view name : kModuleChannels) {
+  for (const std::string_view name : moduleChannels()) {
     text += std::string(name) + " = 0 events [Max Reports: 0 events closed to 0 events closed]\n";
   }
   return text;
@@ -44,7 +44,7 @@ TEST(TesselTelemonAnalysis, LimitsEveryChannelToZeroEvents) {
 
 TEST(TesselTelemonAnalysis, KeepsItsOrderWhateverTheOrderOfTheMeasurements) {
   QZExperimentResult backwards;
-  for (auto name = kModuleChannels.rbegin(); name != kModuleChannels.rend(); ++name) {
+  for (auto name = moduleChannels().rbegin(); name != moduleChannels().rend(); ++name) {
     backwards.measurements().set(*name, Measurement(0, QZDimensionlessUnit::events()));
   }
   const auto result = QZTesselTelemonAnalysis().analyzeExperimentResult(backwards, nullptr);
@@ -87,7 +87,7 @@ TEST(TesselTelemonAnalysis, PassesMeasurementsOnAsTheyAre) {
 }
 
 TEST(TesselTelemonAnalysis, FailsWhenAnyOneOfTheChannelsIsMissing) {
-  for (const std::string_view name : kModuleChannels) {
+  for (const std::string_view name : moduleChannels()) {
     SCOPED_TRACE(name);
     QZExperimentResult measured = resultOfQuietModule();
     ASSERT_TRUE(measured.measurements().erase(name));

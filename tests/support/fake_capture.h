@@ -1,18 +1,15 @@
-// A capture service made by hand: it takes what it is given, answers what it is told to, and fails where it is told to.
-// For what no healthy phone would do.
+// A scripted capture service for camera synchronisation, whose calls a transcript holds.
 #pragma once
 
-#include "contract/message_format.h"
 #include "diagnostics/camera_sync/camera_sync_experiment.h"
 #include "platform/capture_keys.h"
 #include "tests/support/run_transcript.h"
+#include "tests/support/scripted_capture.h"
 
 #include <gtest/gtest.h>
 
 #include <chrono>
 #include <memory>
-#include <optional>
-#include <set>
 #include <string>
 #include <string_view>
 #include <utility>
@@ -37,146 +34,6 @@ inline void expectFreshPlace(const DiagnosticErrorPtr* error) {
     EXPECT_EQ(*error, nullptr) << "a call was given a place that still holds an error";
   }
 }
-
-// Holds whatever properties it is given; refuses to set those it is told to refuse, without an error of its own.
-template <class Interface>
-class FakeCaptureObject : public Interface {
- public:
-  FakeCaptureObject(RunTranscript& transcript, std::string id) : transcript_(transcript), id_(std::move(id)) {}
-
-  std::string description() const override { return id_; }
-  std::optional<Value> valueForProperty(std::string_view key, DiagnosticErrorPtr* error) override {
-    expectFreshPlace(error);
-    const Value* value = properties.find(key);
-    record("valueForProperty", key, value != nullptr);
-    return value == nullptr ? std::nullopt : std::optional(*value);
-  }
-  bool setValue(const Value& value, std::string_view key, DiagnosticErrorPtr* error) override {
-    expectFreshPlace(error);
-    const bool accepted = !refused.contains(std::string(key));
-    record("setValue", std::string(key) + " = " + defaultText(value), accepted);
-    if (accepted) properties.set(key, value);
-    return accepted;
-  }
-
-  Dictionary properties;
-  std::set<std::string> refused;
-
- protected:
-  void record(std::string_view operation, std::string_view detail, bool succeeded) const {
-    transcript_.addCall("Fake." + std::string(operation), id_, detail, succeeded);
-  }
-
- private:
-  RunTranscript& transcript_;
-  std::string id_;
-};
-
-class FakeStream final : public FakeCaptureObject<CaptureStream> {
- public:
-  FakeStream(RunTranscript& transcript, std::string id, const Value& portType)
-      : FakeCaptureObject(transcript, std::move(id)) {
-    properties.set(capture_key::PortType, portType);
-    properties.set(capture_key::ErrorCounters, Dictionary{{"Count", 0}});
-  }
-
-  bool start(DiagnosticErrorPtr* error) override {
-    expectFreshPlace(error);
-    record("start", "", true);
-    return true;
-  }
-  bool stop(DiagnosticErrorPtr* error) override {
-    expectFreshPlace(error);
-    record("stop", "", true);
-    return true;
-  }
-};
-using FakeStreams = std::vector<std::shared_ptr<FakeStream>>;
-
-class FakeGroup final : public FakeCaptureObject<SynchronizedStreamsGroup> {
- public:
-  FakeGroup(RunTranscript& transcript, std::string id, const FakeStreams& streams)
-      : FakeCaptureObject(transcript, std::move(id)), members(CaptureStreams(streams.begin(), streams.end())) {
-    if (!streams.empty()) properties.set(capture_key::SynchronizationMaster, streams.front());
-    properties.set(capture_key::MasterConfigurationSupportedKeys,
-                   Array{Value(capture_key::SlaveConfigurationByPortType)});
-  }
-
-  std::optional<CaptureStreams> streams(DiagnosticErrorPtr* error) override {
-    expectFreshPlace(error);
-    record("streams", "", members.has_value());
-    return members;
-  }
-
-  std::optional<CaptureStreams> members;
-};
-
-class FakeDevice final : public FakeCaptureObject<CaptureDevice> {
- public:
-  explicit FakeDevice(RunTranscript& transcript) : FakeCaptureObject(transcript, "device") {}
-
-  std::optional<SynchronizedStreamsGroups> synchronizedStreamsGroups(DiagnosticErrorPtr* error) override {
-    expectFreshPlace(error);
-    record("synchronizedStreamsGroups", "", true);
-    return groups;
-  }
-  bool requestControlOfStreams(const CaptureStreams& streams, DiagnosticErrorPtr* error) override {
-    expectFreshPlace(error);
-    record("requestControlOfStreams", defaultText(Array(streams.begin(), streams.end())), true);
-    return true;
-  }
-  bool relinquishControlOfStreams(const CaptureStreams& streams, DiagnosticErrorPtr* error) override {
-    expectFreshPlace(error);
-    record("relinquishControlOfStreams", defaultText(Array(streams.begin(), streams.end())), true);
-    return true;
-  }
-
-  // What a camera sync run has no use for.
-  std::optional<CaptureStreams> streams(DiagnosticErrorPtr*) override {
-    record("streams", "", false);
-    return std::nullopt;
-  }
-  bool invalidate(DiagnosticErrorPtr*) override {
-    record("invalidate", "", false);
-    return false;
-  }
-
-  SynchronizedStreamsGroups groups;
-};
-
-class FakePlugIn final : public CapturePlugIn {
- public:
-  explicit FakePlugIn(std::shared_ptr<FakeDevice> device) : device_(std::move(device)) {}
-
-  std::string description() const override { return "plug-in"; }
-  std::shared_ptr<CaptureDevice> device(DiagnosticErrorPtr* error) override {
-    expectFreshPlace(error);
-    return device_;
-  }
-
- private:
-  std::shared_ptr<FakeDevice> device_;
-};
-
-class FakeService final : public CaptureService {
- public:
-  explicit FakeService(std::shared_ptr<FakeDevice> device) : device_(std::move(device)) {}
-
-  std::shared_ptr<CapturePlugIn> createPlugIn() override {
-    auto plugIn = std::make_shared<FakePlugIn>(device_);
-    lastPlugIn = plugIn;
-    return plugIn;
-  }
-
-  std::shared_ptr<CapturePlugIn> defaultPlugIn() override { return nullptr; }  // a camera sync run makes its own
-
-  void forgetDevice() { device_.reset(); }
-
-  std::weak_ptr<FakePlugIn> lastPlugIn;
-
- private:
-  std::shared_ptr<FakeDevice> device_;
-};
 
 // Lets no time pass and tells how long it was asked to sleep.
 class FakeClock final : public Clock {
@@ -227,20 +84,37 @@ class FakeCaptureTest : public testing::Test {
     return runAndTell(experiment, ErrorPlace::kGiven, transcript);
   }
 
-  std::shared_ptr<FakeStream> makeStream(const std::string& id, const Value& port) {
-    return std::make_shared<FakeStream>(transcript, id, port);
+  std::shared_ptr<ScriptedStream> makeStream(const std::string& id, const Value& port) {
+    auto stream = std::make_shared<ScriptedStream>(id, script);
+    stream->properties.set(capture_key::PortType, port);
+    stream->properties.set(capture_key::ErrorCounters, Dictionary{{"Count", 0}});
+    return stream;
   }
-  std::shared_ptr<FakeGroup> makeGroup(const std::string& id, const FakeStreams& streams) {
-    return std::make_shared<FakeGroup>(transcript, id, streams);
+  std::shared_ptr<ScriptedGroup> makeGroup(const std::string& id,
+                                           const std::vector<std::shared_ptr<ScriptedStream>>& streams) {
+    auto made = std::make_shared<ScriptedGroup>(id, script);
+    made->members = CaptureStreams(streams.begin(), streams.end());
+    if (!streams.empty()) made->properties.set(capture_key::SynchronizationMaster, streams.front());
+    made->properties.set(capture_key::MasterConfigurationSupportedKeys,
+                         Array{Value(capture_key::SlaveConfigurationByPortType)});
+    return made;
   }
 
   RunTranscript transcript;
-  std::shared_ptr<FakeDevice> device = std::make_shared<FakeDevice>(transcript);
-  std::shared_ptr<FakeStream> wide = makeStream("wide", kWidePort);
-  std::shared_ptr<FakeStream> tele = makeStream("tele", kTelePort);
-  std::shared_ptr<FakeStream> super = makeStream("super", kSuperPort);
-  std::shared_ptr<FakeGroup> group = makeGroup("group", {wide, tele, super});
-  std::shared_ptr<FakeService> service = std::make_shared<FakeService>(device);
+  const CaptureScript script = [this](const ScriptedCall& call) {
+    if (call.object == "service") return call.operation == "createPlugIn";  // a camera sync run makes its own plug-in
+    expectFreshPlace(call.error);
+    if (call.object != "plug-in") {
+      transcript.addCall("Fake." + std::string(call.operation), call.object, call.detail, call.succeeds);
+    }
+    return call.succeeds;
+  };
+  std::shared_ptr<ScriptedDevice> device = std::make_shared<ScriptedDevice>("device", script);
+  std::shared_ptr<ScriptedStream> wide = makeStream("wide", kWidePort);
+  std::shared_ptr<ScriptedStream> tele = makeStream("tele", kTelePort);
+  std::shared_ptr<ScriptedStream> super = makeStream("super", kSuperPort);
+  std::shared_ptr<ScriptedGroup> group = makeGroup("group", {wide, tele, super});
+  std::shared_ptr<ScriptedCapture> service = std::make_shared<ScriptedCapture>(device, script);
   std::shared_ptr<FakeClock> clock = std::make_shared<FakeClock>(transcript);
 
  private:

@@ -1,6 +1,7 @@
 #include "tests/support/hand_made_camera.h"
 
 #include "platform/capture_keys.h"
+#include "tests/support/scripted_capture.h"
 
 #include <cstdint>
 #include <string>
@@ -55,49 +56,6 @@ std::optional<Value> metadataOf(FrameKind kind) {
   }
   return std::nullopt;
 }
-
-class HandMadeDevice final : public CaptureDevice {
- public:
-  explicit HandMadeDevice(std::shared_ptr<HandMadeStream> stream) : stream_(std::move(stream)) {}
-
-  std::string description() const override { return "device"; }
-  std::optional<Value> valueForProperty(std::string_view, DiagnosticErrorPtr*) override { return std::nullopt; }
-  bool setValue(const Value&, std::string_view, DiagnosticErrorPtr*) override { return false; }
-  std::optional<CaptureStreams> streams(DiagnosticErrorPtr*) override { return CaptureStreams{stream_}; }
-  std::optional<SynchronizedStreamsGroups> synchronizedStreamsGroups(DiagnosticErrorPtr*) override {
-    return SynchronizedStreamsGroups{};
-  }
-  bool requestControlOfStreams(const CaptureStreams&, DiagnosticErrorPtr*) override { return true; }
-  bool relinquishControlOfStreams(const CaptureStreams&, DiagnosticErrorPtr*) override { return true; }
-  bool invalidate(DiagnosticErrorPtr*) override { return true; }
-
- private:
-  std::shared_ptr<HandMadeStream> stream_;
-};
-
-class HandMadePlugIn final : public CapturePlugIn {
- public:
-  explicit HandMadePlugIn(std::shared_ptr<HandMadeStream> stream)
-      : device_(std::make_shared<HandMadeDevice>(std::move(stream))) {}
-
-  std::string description() const override { return "plug-in"; }
-  std::shared_ptr<CaptureDevice> device(DiagnosticErrorPtr*) override { return device_; }
-
- private:
-  std::shared_ptr<CaptureDevice> device_;
-};
-
-class HandMadeCapture final : public CaptureService {
- public:
-  explicit HandMadeCapture(std::shared_ptr<HandMadeStream> stream)
-      : plugIn_(std::make_shared<HandMadePlugIn>(std::move(stream))) {}
-
-  std::shared_ptr<CapturePlugIn> createPlugIn() override { return plugIn_; }
-  std::shared_ptr<CapturePlugIn> defaultPlugIn() override { return plugIn_; }
-
- private:
-  std::shared_ptr<CapturePlugIn> plugIn_;
-};
 
 // Every channel at the same count.
 class HandMadeSnapshot final : public ReportSnapshot {
@@ -240,7 +198,9 @@ const Dictionary& handMadeErrorCounters() {
 }
 
 std::shared_ptr<CaptureService> makeHandMadeCapture(std::shared_ptr<HandMadeStream> stream) {
-  return std::make_shared<HandMadeCapture>(std::move(stream));
+  auto device = std::make_shared<ScriptedDevice>("device");
+  device->members = CaptureStreams{std::move(stream)};
+  return std::make_shared<ScriptedCapture>(std::move(device));
 }
 
 std::shared_ptr<const ReportChannelSet> HandMadeReports::reportWithOnlySimpleChannels(DiagnosticErrorPtr*) {

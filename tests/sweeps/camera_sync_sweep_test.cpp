@@ -5,6 +5,7 @@
 #include "contract/message_format.h"
 #include "diagnostics/camera_sync/camera_sync_experiment.h"
 #include "tests/support/run_transcript.h"
+#include "tests/support/shipped_scenario.h"
 #include "tests/sweeps/camera_sync_oracle.h"
 
 #include <gtest/gtest.h>
@@ -94,7 +95,7 @@ struct Outcome {
 class CameraSyncSweep : public testing::TestWithParam<Sweep> {
  protected:
   void SetUp() override {
-    scenario_ = readScenario(QUAZOR_SCENARIOS "/healthy.json");
+    scenario_ = shippedScenario("healthy");
     for (CameraGroup& group : scenario_.groups) group.masterConfiguration = GetParam().masterConfiguration;
     phone_ = phoneOf(scenario_);
   }

@@ -2,6 +2,7 @@
 // last word with what the oracle says it must be.
 #include "backends/simulated/scenario/scenario.h"
 #include "tests/support/run_transcript.h"
+#include "tests/support/shipped_scenario.h"
 #include "tests/sweeps/projector_bench.h"
 #include "tests/sweeps/projector_oracle.h"
 
@@ -63,7 +64,7 @@ std::string csvFieldsOf(FrameFault fault) {
 }
 
 Scenario scenarioOf(const Sweep& sweep) {
-  Scenario scenario = sweep.isShipped ? readScenario(QUAZOR_SCENARIOS "/healthy.json") : projectorScenario();
+  Scenario scenario = sweep.isShipped ? shippedScenario("healthy") : projectorScenario();
   if (sweep.secondFrame) setFrame(scenario, 2, metadataOf(*sweep.secondFrame));
   infraredCamera(scenario).deliversFrames = sweep.sendsFrames;
   return scenario;

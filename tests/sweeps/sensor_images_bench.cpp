@@ -21,11 +21,7 @@ namespace quazor {
 
 namespace {
 
-using sensor_oracle::Power;
 using sensor_oracle::Receiver;
-
-// As kSensorFailed says it.
-const FaultError kSensorError{"SensorErrorDomain", -536870174, "The sensor does not answer."};
 
 std::string_view nameOf(RunLoopResult result) {
   switch (result) {
@@ -137,40 +133,6 @@ class Listener final : public QZNimbeImageStreamDelegate {
   const std::function<void()> close_;  // empty when the listener does not close the stream
 };
 
-HidReportShape shapeOf(const sensor_oracle::Report& report) {
-  HidReportShape shape;
-  shape.reportID = static_cast<std::uint8_t>(report.id);
-  shape.length = report.length;
-  return shape;
-}
-
-HidDeviceConfig traitsOf(const sensor_oracle::Sensor& sensor, std::string name) {
-  HidDeviceConfig traits;
-  traits.name = std::move(name);
-  traits.usagePage = static_cast<std::uint16_t>(sensor.usagePage);
-  traits.usage = static_cast<std::uint16_t>(sensor.usage);
-  // A sensor that refuses something wants another setting, which it never gets.
-  const bool takesPower = sensor.powerRefusal.empty();
-  traits.featureReports = {takesPower ? HidFeatureReport{0xAB, {0, 1}, 1} : HidFeatureReport{0xAB, {0, 2}, 2}};
-  const bool takesStreaming = sensor.streamingRefusal.empty();
-  traits.featureReports.push_back(takesStreaming ? HidFeatureReport{0xAC, {0, 1}, 1} : HidFeatureReport{0xAD, {}, 1});
-  traits.rate = static_cast<double>(sensor.rate);
-  traits.reportCount = sensor.count;
-  traits.removedAfter = sensor.removedAfter;
-  traits.every = shapeOf(sensor.every);
-  for (const auto& [number, report] : sensor.single) {
-    traits.single[number] = report.error.empty() ? shapeOf(report) : HidReportShape{{}, {}, kSensorError};
-  }
-  traits.images = {sensor.firstFrameID,
-                   static_cast<std::int32_t>(sensor_oracle::kAmplitude),
-                   static_cast<std::int32_t>(sensor_oracle::kOffsetI),
-                   static_cast<std::int32_t>(sensor_oracle::kOffsetQ),
-                   sensor_oracle::kPhaseStep,
-                   sensor_oracle::kPhaseStepPerImage,
-                   std::stof(sensor_oracle::kCelsius)};
-  return traits;
-}
-
 class Bench {
  public:
   Bench(const Scenario& scenario, const SensorRequest& request, ErrorPlace place, std::uint64_t seed)
@@ -193,7 +155,7 @@ class Bench {
     letOthersIn();
     bool returned = true;
     try {
-      request_.receiver ? watchStream() : runExperiment();
+      request_.receiver == Receiver::kExperiment ? runExperiment() : watchStream();
     } catch (const SimulationStall& stall) {
       const std::string_view what = stall.what();
       say("never returned: " + std::string(what.substr(0, what.rfind(", at "))));
@@ -236,15 +198,14 @@ class Bench {
 
   void letOthersIn() {
     if (const auto time = request_.others.source) {
-      otherSource_ = rawLoop_.makeSource([this, time] {
-        scheduler_.blockUntil(scheduler_.after(std::chrono::nanoseconds(*time)), "another source is handled");
-      });
+      otherSource_ = rawLoop_.makeSource(
+          [this, time] { scheduler_.blockUntil(scheduler_.after(*time), "another source is handled"); });
       rawLoop_.addSource(otherSource_, kRunLoopDefaultMode);
       otherSource_->signal();
     }
     if (const auto time = request_.others.stop) {
       stopper_ = phone_.platform().concurrency->makeSerialQueue("stopper", QualityOfService::kBackground);
-      stopper_->asyncAfter(std::chrono::nanoseconds(*time), [this] { rawLoop_.stop(); });
+      stopper_->asyncAfter(*time, [this] { rawLoop_.stop(); });
     }
   }
 
@@ -357,22 +318,6 @@ class Bench {
 };
 
 }  // namespace
-
-Scenario scenarioOf(const sensor_oracle::Phone& phone) {
-  Scenario scenario;
-  scenario.title = "A phone whose display sensor can be tried";
-  for (std::size_t i = 0; i < phone.sensors.size(); ++i) {
-    scenario.hidDevices.push_back(traitsOf(phone.sensors[i], i == 0 ? "display-sensor" : "other-sensor"));
-  }
-  scenario.display.present = phone.display.present;
-  scenario.display.registryService = phone.display.hasRegistryEntry;
-  if (phone.display.hasProperty) {
-    Dictionary power;
-    if (phone.display.power != Power::kUnknown) power.set("DSPLY power info panel", phone.display.power == Power::kOn);
-    scenario.display.properties.set("DSPLY Debug Info", Dictionary{{"DSPLY power info", power}});
-  }
-  return scenario;
-}
 
 SensorRun runSensor(const Scenario& scenario, const SensorRequest& request, const std::vector<Fault>& faults,
                     ErrorPlace place, std::uint64_t seed) {

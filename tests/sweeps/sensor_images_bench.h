@@ -16,22 +16,17 @@
 
 namespace quazor {
 
-// The texts of errors of a sensor: what it sends in place of a report, and what it says to a mode that it refuses.
-inline constexpr const char* kSensorFailed = "SensorErrorDomain code -536870174: The sensor does not answer.";
-inline constexpr const char* kPowerRefused =
-    "SimulatedHidErrorDomain code 6: Feature report 0xAB of display-sensor does not take the value 1.";
-inline constexpr const char* kStreamingRefused =
-    "SimulatedHidErrorDomain code 5: display-sensor has no feature report 0xAC.";
-
-// The phone as the simulation takes it: with its sensors and its display, and nothing else. The sensors' errors must be
-// those above.
-Scenario scenarioOf(const sensor_oracle::Phone& phone);
+// What others do with the loop of the run.
+struct OthersOnLoop {
+  std::optional<std::chrono::nanoseconds> source = {};  // another source, signalled before the run, is handled so long
+  std::optional<std::chrono::nanoseconds> stop = {};    // when the loop is stopped
+};
 
 struct SensorRequest {
-  Dictionary parameters;                                 // of the experiment
-  std::optional<sensor_oracle::Receiver> receiver = {};  // as in sensor_oracle::Request
-  std::chrono::seconds watched{1};                       // of a stream alone
-  sensor_oracle::Others others = {};
+  Dictionary parameters;  // of the experiment
+  sensor_oracle::Receiver receiver = sensor_oracle::Receiver::kExperiment;
+  std::chrono::seconds watched{1};  // a stream alone
+  OthersOnLoop others = {};
   std::chrono::nanoseconds period{50'000'000};  // of the sensor's reports
 };
 

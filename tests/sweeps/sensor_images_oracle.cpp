@@ -1,36 +1,85 @@
 #include "tests/sweeps/sensor_images_oracle.h"
 
 #include <algorithm>
-#include <array>
+#include <charconv>
 #include <cmath>
-#include <deque>
 #include <limits>
 #include <map>
 #include <numbers>
+#include <optional>
 #include <string_view>
-#include <utility>
 
 namespace quazor::sensor_oracle {
 
 namespace {
 
+using Time = std::int64_t;
+
 constexpr Time kSecond = 1'000'000'000;
 constexpr Time kNever = std::numeric_limits<Time>::max();
-constexpr std::string_view kDevice = "display-sensor";
-constexpr std::size_t kWaitingReports = 64;  // as many as the phone keeps for a receiver that is busy
+constexpr std::string_view kFailed = " -> failed";
+constexpr std::string_view kNeverReturned = "never returned: The simulated phone waits for ever: ";
 
-// Thrown by what never returns.
-struct Stall {
-  std::string what;
+// Thrown where a run breaks a rule: what follows cannot be read.
+struct Broken {
+  std::string rule;
 };
-// Thrown where no HID manager can be made.
-struct NoManager {};
+// Thrown where the run tells that it never returned.
+struct NeverReturned {
+  std::string why;
+};
+// Thrown where the run can only raise.
+struct Raises {};
 
-struct Input {
+// A line of the run; of a call without its time.
+struct Line {
+  std::string text;
+  std::optional<Time> at;
+  bool failed = false;
+};
+
+Line lineOf(std::string_view text) {
+  Line line;
+  line.failed = text.ends_with(kFailed);
+  if (line.failed) text.remove_suffix(kFailed.size());
+  if (const std::size_t at = text.rfind(" at "); at != std::string_view::npos) {
+    Time time = 0;
+    const char* const end = text.data() + text.size();
+    const auto [last, problem] = std::from_chars(text.data() + at + 4, end, time);
+    if (problem == std::errc() && last == end) {
+      line.at = time;
+      text = text.substr(0, at);
+    }
+  }
+  line.text = text;
+  return line;
+}
+
+std::vector<Line> linesOf(std::string_view text) {
+  std::vector<Line> lines;
+  while (!text.empty()) {
+    const std::size_t end = std::min(text.find('\n'), text.size() - 1);
+    lines.push_back(lineOf(text.substr(0, end)));
+    text.remove_prefix(end + 1);
+  }
+  return lines;
+}
+
+// The number that the text begins with is taken away from it.
+std::uint64_t takeNumber(std::string_view& text) {
   std::uint64_t number = 0;
-  Time sent = 0;
-  Report report;
-};
+  const auto [end, problem] = std::from_chars(text.data(), text.data() + text.size(), number);
+  if (problem != std::errc()) throw Broken{"there is no number where one is due: " + std::string(text.substr(0, 40))};
+  text.remove_prefix(static_cast<std::size_t>(end - text.data()));
+  return number;
+}
+
+void takeWord(std::string_view& text, std::string_view word) {
+  if (!text.starts_with(word)) {
+    throw Broken{"'" + std::string(word) + "' is due at '" + std::string(text.substr(0, word.size())) + "'"};
+  }
+  text.remove_prefix(word.size());
+}
 
 std::string samples(std::uint64_t number, double offset, double (*wave)(double)) {
   std::string text;
@@ -53,445 +102,352 @@ const std::string& scans(std::uint64_t number) {
   return text;
 }
 
-// The first sensor of the phone: it streams while one of its two users, the run and the bench, has it open and both of
-// its modes are as they should be.
-class SensorModel {
+// Reads a run line by line; what it got as answers says which line must be next.
+class Reader {
  public:
-  explicit SensorModel(const Sensor& sensor) : sensor_(sensor) {}
+  Reader(const Known& known, const std::string& told) : known_(known), lines_(linesOf(told)) {}
 
-  bool isGone() const { return gone_; }
-  bool isOpen(std::size_t user) const { return open_[user]; }
-  void setOpen(std::size_t user, bool open, Time now) {
-    open_[user] = open;
-    update(now);
-  }
-  void setActive(Time now) {
-    active_ = true;
-    update(now);
-  }
-  void setImagesOnly(Time now) {
-    imagesOnly_ = true;
-    update(now);
-  }
-
-  Time due() const {
-    if (!streaming_ || (sensor_.count && number_ >= *sensor_.count)) return kNever;
-    return start_ + ((sent_ + 1) * kSecond + sensor_.rate - 1) / sensor_.rate;
-  }
-  Input send(Time now) {
-    Input input{number_++, now, sensor_.every};
-    ++sent_;
-    if (input.number == sensor_.removedAfter) {
-      gone_ = true;
-      input.report.error = "SimulatedHidErrorDomain code 4: display-sensor has been removed.";
-    } else if (const auto single = sensor_.single.find(input.number); single != sensor_.single.end()) {
-      input.report = single->second;
-    }
-    update(now);
-    return input;
-  }
-
- private:
-  void update(Time now) {
-    const bool streams = !gone_ && (open_[0] || open_[1]) && active_ && imagesOnly_;
-    if (streams && !streaming_) {
-      start_ = now;
-      sent_ = 0;
-    }
-    streaming_ = streams;
-  }
-
-  const Sensor& sensor_;
-  std::array<bool, 2> open_{};
-  bool active_ = false;
-  bool imagesOnly_ = false;
-  bool gone_ = false;
-  bool streaming_ = false;
-  Time start_ = 0;
-  std::int64_t sent_ = 0;  // since start_
-  std::uint64_t number_ = 0;
-};
-
-class Run {
- public:
-  Run(const Phone& phone, const Request& request, const std::vector<Failure>& failures, bool reportsAreInTime)
-      : phone_(phone),
-        request_(request),
-        failures_(failures),
-        taken_(failures.size()),
-        fired_(failures.size()),
-        reportsAreInTime_(reportsAreInTime),
-        sensor_(phone.sensors.empty() ? kNoSensor : phone.sensors.front()) {}
-
-  Prediction predict(bool hasPlaceForError) {
-    hasPlaceForError_ = hasPlaceForError;
-    bool returned = true;
+  void read() {
     try {
-      request_.receiver ? watchStream() : runExperiment();
-    } catch (const Stall& stall) {
-      say("never returned: The simulated phone waits for ever: " + stall.what);
-      sayError(error_.empty());
-      returned = false;
-    } catch (const NoManager&) {
-      say("raised No HID Manager available?!");
-      sayError(true);
+      known_.receiver == Receiver::kExperiment ? readExperiment() : readStream();
+    } catch (const Raises&) {
+      expect("raised No HID Manager available?!");
+      readOutcome(true);
+    } catch (const NeverReturned& end) {
+      returned_ = false;
+      readOutcome(errorIsUntouched_);
+      const bool isEndless = known_.timeout > static_cast<std::uint64_t>(kNever / kSecond);
+      if (!end.why.ends_with(" hangs") && !isEndless) throw Broken{"the run waits for ever, and nothing hangs"};
     }
-    say("ended" + at());
-    if (std::ranges::all_of(fired_, [](std::uint64_t times) { return times == 1; }) &&
-        std::ranges::all_of(failures_, [](const Failure& failure) { return failure.occurrence.has_value(); })) {
-      lookAfterwards(returned);
-    }
-    return {told_, calls_, fired_};
+    expect("ended");
+    if (next_ < lines_.size()) readAfterwards();
+    if (next_ < lines_.size()) throw Broken{"the run goes on after its end: " + lines_[next_].text};
   }
-  // Whether anybody has slept until the very moment of a report.
-  bool metATie() const { return metATie_; }
 
  private:
-  static constexpr std::size_t kRun = 0;
-  static constexpr std::size_t kBench = 1;
-  static const Sensor kNoSensor;
-  enum class End { kTimedOut, kStopped, kFinished };
-
-  // What is told.
-  void say(const std::string& line) { told_ += line + '\n'; }
-  std::string at() const { return " at " + std::to_string(now_); }
-  void sayError(bool isUntouched) {
-    if (!hasPlaceForError_) return say("no place for an error");
-    say(isUntouched ? "error untouched" : "error " + error_);
+  // The next line, whose time is not before that of the one before it.
+  const Line& peek() const {
+    static const Line kNothing{"", std::nullopt, false};
+    return next_ < lines_.size() ? lines_[next_] : kNothing;
   }
-  bool fail(int code, const std::string& message, const std::string& cause = "") {
-    error_ = "QZNimbeImageExperimentErrorDomain code " + std::to_string(code) + ": " + message +
-             (cause.empty() ? "" : ", caused by " + cause);
+  bool comes(std::string_view beginning) const { return peek().text.starts_with(beginning); }
+  const Line& take() {
+    if (next_ >= lines_.size()) throw Broken{"the run ends early"};
+    const Line& line = lines_[next_++];
+    if (line.at && *line.at < now_) throw Broken{"the time goes backwards at: " + line.text};
+    now_ = line.at.value_or(now_);
+    return line;
+  }
+  const Line& expect(const std::string& text) {
+    if (peek().text != text) throw Broken{"'" + text + "' is due at '" + peek().text + "'"};
+    return take();
+  }
+
+  void readIfNeverReturned() {
+    if (comes(kNeverReturned)) throw NeverReturned{take().text};
+  }
+  // The next call is this one: whether it succeeded.
+  bool call(const std::string& text) {
+    readIfNeverReturned();
+    return !expect(text).failed;
+  }
+
+  // The place for an error after an outcome.
+  void readOutcome(bool isUntouched) {
+    if (!known_.hasPlaceForError) {
+      expect("no place for an error");
+    } else if (isUntouched) {
+      expect("error untouched");
+    } else {
+      readError();
+    }
+  }
+  void readError() {
+    const std::string text = take().text;
+    if (due_.ownText.empty()) {
+      if (!text.starts_with("error ") || !known_.errors.contains(text.substr(6))) {
+        throw Broken{"no report gave the error: " + text};
+      }
+      return;
+    }
+    const std::string own = "error QZNimbeImageExperimentErrorDomain code " + due_.ownText;
+    if (text == own && (!due_.hasCause || known_.mayFailSilently)) return;
+    const std::string before = own + ", caused by ";
+    if (!due_.hasCause || !text.starts_with(before) || !known_.errors.contains(text.substr(before.size()))) {
+      throw Broken{"'" + own + (due_.hasCause ? ", caused by ...'" : "'") + " is due at '" + text + "'"};
+    }
+  }
+  bool fail(int code, const std::string& message, bool hasCause = false) {
+    due_ = {std::to_string(code) + ": " + message, hasCause};
     return false;
   }
 
-  // The next call: whether it has its effect. Leaves the text of the call's error in cause_.
-  bool call(const std::string& operation, const std::string& detail = "", const std::string& refusal = "",
-            const std::string& property = "") {
-    const bool isOfDevice = operation.starts_with("HidDevice.");
-    const std::size_t point = operation.find('.');
-    const std::string object = isOfDevice ? std::string(kDevice) : operation.substr(0, point);
-    const Failure* ending = nullptr;
-    Time delay = 0;
-    for (std::size_t i = 0; i < failures_.size(); ++i) {
-      const Failure& failure = failures_[i];
-      if (failure.operation != "*" && failure.operation != operation) continue;
-      ++taken_[i];
-      if (failure.occurrence && failure.occurrence != taken_[i]) continue;
-      if (failure.action == Action::kDelay) {
-        delay += failure.delay;
-      } else if (ending == nullptr) {
-        ending = &failure;
-      } else {
-        continue;
-      }
-      ++fired_[i];
+  bool readSetUp() {
+    if (!call("FramebufferService mainDisplay")) {
+      return fail(2, "Could not get the main display to determine device power state.");
     }
-    sleepUntil(now_ + delay);
-    if (ending != nullptr && ending->action == Action::kHang) {
-      throw Stall{operation + (isOfDevice ? " of " + object : "") + (property.empty() ? "" : " for " + property) +
-                  " hangs"};
+    if (!call("Display registryService")) {
+      return fail(2, "Could not get the frame buffer to determine device power state.");
     }
-    cause_ = ending != nullptr ? ending->error : refusal;
-    const bool succeeds = ending == nullptr && refusal.empty();
-    ++calls_;
-    say(object + ' ' + operation.substr(point + 1) + (detail.empty() ? "" : ' ' + detail) + at() +
-        (succeeds ? "" : " -> failed"));
-    return succeeds;
-  }
-  void sayOfLoop(const std::string& what) { say("RunLoop " + what + at()); }
-
-  // Time passes. Who sleeps until the very moment of a report may wake before it or after it.
-  Time nextEvent() const {
-    return std::min(sensor_.due(), request_.others.stop && !stopDone_ ? *request_.others.stop : kNever);
-  }
-  bool comesBy(Time end) {
-    if (nextEvent() == end && end != kNever) metATie_ = true;
-    return nextEvent() < end || (nextEvent() == end && end != kNever && reportsAreInTime_);
-  }
-  void happen() {
-    now_ = std::max(now_, nextEvent());
-    if (sensor_.due() > now_) {
-      stopDone_ = true;
-      if (loopRuns_) stopped_ = true;
-      return;
+    if (!call("RegistryService registryProperty DSPLY Debug Info")) {
+      return fail(2, "Could not find the display power state.");
     }
-    const bool runHasOpen = sensor_.isOpen(kRun);
-    const bool benchHasOpen = sensor_.isOpen(kBench);
-    const Input input = sensor_.send(now_);
-    if (benchHasOpen && !benchSees_) benchSees_ = input;
-    if (!runHasOpen || !scheduled_ || (waiting_.size() >= kWaitingReports && input.report.error.empty())) return;
-    waiting_.push_back(input);
-    signalled_ = true;
-  }
-  void sleepUntil(Time end) {
-    if (end <= now_) return;
-    while (comesBy(end)) happen();
-    now_ = end;
+    if (!known_.displayProblem.empty()) return fail(2, known_.displayProblem);
+    return call("RunLoops currentRunLoop") || fail(1, "Nimbe is a HID device that requires a current run loop.");
   }
 
-  // The loop.
-  void stopLoop() {
-    sayOfLoop("stop");
-    stopped_ = true;
-  }
-  End runLoop(Time limit) {
-    sayOfLoop("runInMode default " + std::to_string(limit) + " ns");
-    const Time deadline = limit >= kNever - now_ ? kNever : now_ + limit;
-    loopRuns_ = true;
-    for (;;) {
-      if (std::exchange(otherIsSignalled_, false)) sleepUntil(now_ + *request_.others.source);
-      if (std::exchange(signalled_, false)) deliver();
-      if (deadline != kNever && now_ >= deadline) return End::kTimedOut;
-      if (stopped_) return End::kStopped;
-      if (!scheduled_ && !request_.others.source) return End::kFinished;
-      waitUntil(deadline);
-    }
-  }
-  void waitUntil(Time deadline) {
-    while (!signalled_ && !stopped_) {
-      if (comesBy(deadline)) {
-        happen();
-        continue;
-      }
-      if (deadline == kNever) throw Stall{"a run loop waits for what nothing will signal or stop"};
-      now_ = deadline;
-      return;
-    }
-  }
-  void sayEndOfLoop(End end) {
-    loopRuns_ = false;
-    sayOfLoop(end == End::kTimedOut ? "run timed out" : end == End::kStopped ? "run stopped" : "run finished");
-  }
-
-  // The stream.
-  bool openStream() {
-    if (!call("HidService.createManager")) throw NoManager{};
-    std::size_t found = 0;
-    for (const Sensor& sensor : phone_.sensors) found += sensor.usagePage == 0xFF00 && sensor.usage == 0x24 ? 1U : 0U;
-    const bool looked = call("HidManager.enumerateDevicesMatching", "({PrimaryUsagePage = 65280; PrimaryUsage = 36})");
-    if (!looked) found = 0;
-    if (!call("HidManager.devices", std::to_string(found)) || found != 1) {
-      return fail(3, "Nimbe device match was ambiguous!");
-    }
+  bool readOpening() {
+    if (!call("HidService createManager")) throw Raises{};
+    call("HidManager enumerateDevicesMatching ({PrimaryUsagePage = 65280; PrimaryUsage = 36})");
+    readIfNeverReturned();
+    const Line devices = take();
+    std::string_view found = devices.text;
+    takeWord(found, "HidManager devices ");
+    if (takeNumber(found) != 1 || devices.failed) return fail(3, "Nimbe device match was ambiguous!");
     hasDevice_ = true;
-    if (!call("HidDevice.open")) return fail(3, "Could not open Nimbe device.", cause_);
-    sensor_.setOpen(kRun, true, now_);
-    if (call("HidDevice.setInputReportCallback", "receiver")) hasCallback_ = true;
-    const Sensor& sensor = phone_.sensors.front();
-    if (!call("HidDevice.setFeatureReportWithID", "0xAB = ab01", sensor.powerRefusal, "0xAB")) {
-      return fail(4, "Failed to override power mode to active!", cause_);
+    isOpen_ = call("display-sensor open");
+    if (!isOpen_) return fail(3, "Could not open Nimbe device.", true);
+    call("display-sensor setInputReportCallback receiver");
+    if (!call("display-sensor setFeatureReportWithID 0xAB = ab01")) {
+      return fail(4, "Failed to override power mode to active!", true);
     }
-    sensor_.setActive(now_);
-    if (!call("HidDevice.setFeatureReportWithID", "0xAC = ac01", sensor.streamingRefusal, "0xAC")) {
-      return fail(5, "Failed to set streaming mode to images only!", cause_);
+    if (!call("display-sensor setFeatureReportWithID 0xAC = ac01")) {
+      return fail(5, "Failed to set streaming mode to images only!", true);
     }
-    sensor_.setImagesOnly(now_);
-    if (call("HidDevice.scheduleWithRunLoop", "default")) scheduled_ = true;
+    isScheduled_ = call("display-sensor scheduleWithRunLoop default");
+    wasScheduled_ = isScheduled_;
     return true;
   }
 
-  void closeStream() {
+  void readClosing() {
     if (!hasDevice_) return;
-    if (call("HidDevice.setInputReportCallback", "(null)")) hasCallback_ = false;
-    if (call("HidDevice.unscheduleFromRunLoop", "default")) leaveLoop();
-    if (!call("HidDevice.close", "0")) return;
-    sensor_.setOpen(kRun, false, now_);
-    waiting_.clear();
+    if (call("display-sensor setInputReportCallback (null)")) isSilent_ = true;
+    if (call("display-sensor unscheduleFromRunLoop default")) {
+      isSilent_ = true;
+      isScheduled_ = false;
+    }
+    if (call("display-sensor close 0")) {
+      isSilent_ = true;
+      isOpen_ = false;
+    }
   }
-  void leaveLoop() {
-    scheduled_ = false;
-    signalled_ = false;
-    waiting_.clear();
+  // What the sensor sends is heard.
+  void hear() const {
+    if (isSilent_) throw Broken{"something is heard of a sensor that has been closed"};
+    if (!isScheduled_) throw Broken{"something is heard of a sensor that is not on the loop"};
   }
 
-  // Those that wait now; what comes meanwhile is for the next round.
-  void deliver() {
-    for (std::size_t count = waiting_.size(); count > 0 && !waiting_.empty(); --count) {
-      const Input input = waiting_.front();
-      waiting_.pop_front();
-      if (!hasCallback_) continue;
-      if (!input.report.error.empty()) {
-        closeStream();
-        handleError(input.report.error);
-      } else if (input.report.id == 0x76 && input.report.length >= 792) {
-        handleImage(imageText(input));
-      }
+  // What the run of the loop ended in.
+  enum class End { kTimedOut, kStopped, kFinished };
+  End readEndOfLoop(Time deadline) {
+    const std::string text = take().text;
+    if (text == "RunLoop run timed out") {
+      if (now_ < deadline) throw Broken{"the loop has timed out before its time"};
+      return End::kTimedOut;
     }
+    if (text == "RunLoop run stopped") return End::kStopped;
+    if (text != "RunLoop run finished") throw Broken{"the loop ends in: " + text};
+    if (isScheduled_) throw Broken{"the loop has finished with the sensor on it"};
+    return End::kFinished;
   }
-  std::string imageText(const Input& input) const {
-    const std::uint32_t frame = phone_.sensors.front().firstFrameID + static_cast<std::uint32_t>(input.number);
-    return "{frameID = " + std::to_string(frame) + "; " + scans(input.number) + "; tmonDataInC = " + kCelsius +
-           "; timestampInMilliseconds = " + std::to_string(input.sent / 1'000'000) + '}';
-  }
-  void handleImage(const std::string& image) {
-    if (!request_.receiver) {
-      images_.push_back(image);
-      if (images_.size() >= request_.images) stopLoop();
-    } else if (*request_.receiver != Receiver::kNone) {
-      say("delegate handleImage " + image + at());
-      if (*request_.receiver == Receiver::kCloses) closeStream();
-    }
-  }
-  void handleError(const std::string& error) {
-    if (!request_.receiver) {
-      asyncError_ = error;
-      stopLoop();
-    } else if (*request_.receiver != Receiver::kNone) {
-      say("delegate streamDidError " + error + at());
-    }
-  }
-
-  // The two kinds of runs.
-  void watchStream() {
-    const bool opened = openStream();
-    say(opened ? "opened" : "not opened");
-    sayError(opened);
-    if (opened) sayEndOfLoop(runLoop(static_cast<Time>(request_.timeout) * kSecond));
-    closeStream();
-    say("closed");
-    closeStream();
-  }
-
-  bool displayIsPowered() {
-    const Display& display = phone_.display;
-    const std::string absent = "absent";
-    if (!call("FramebufferService.mainDisplay", "", display.present ? "" : absent)) {
-      return fail(2, "Could not get the main display to determine device power state.");
-    }
-    if (!call("Display.registryService", "", display.hasRegistryEntry ? "" : absent)) {
-      return fail(2, "Could not get the frame buffer to determine device power state.");
-    }
-    const std::string property = "DSPLY Debug Info";
-    if (!call("RegistryService.registryProperty", property, display.hasProperty ? "" : absent, property) ||
-        display.power == Power::kUnknown) {
-      return fail(2, "Could not find the display power state.");
-    }
-    return display.power == Power::kOn || fail(2, "The display is not powered.");
-  }
-  bool setUp() {
-    if (!displayIsPowered()) return false;
-    return call("RunLoops.currentRunLoop") || fail(1, "Nimbe is a HID device that requires a current run loop.");
-  }
-
-  bool capture() {
-    if (!openStream()) return false;
-    sayOfLoop("makeObserver of 268435455, repeating, order 0");
-    sayOfLoop("addObserver common");
-    const Time limit = request_.timeout > static_cast<std::uint64_t>(kNever / kSecond)
+  Time readBeginOfLoop() {
+    const Time limit = known_.timeout > static_cast<std::uint64_t>(kNever / kSecond)
                            ? kNever
-                           : static_cast<Time>(request_.timeout) * kSecond;
-    End end = End::kFinished;
+                           : static_cast<Time>(known_.timeout) * kSecond;
+    expect("RunLoop runInMode default " + std::to_string(limit) + " ns");
+    return limit > kNever - now_ ? kNever : now_ + limit;
+  }
+
+  // The run of the experiment: whether it has a result.
+  bool readCapture() {
+    if (!readOpening()) return false;
+    expect("RunLoop makeObserver of 268435455, repeating, order 0");
+    expect("RunLoop addObserver common");
+    const Time deadline = readBeginOfLoop();
+    readReports();
+    const End end = readEndOfLoop(deadline);
+    expect("RunLoop removeObserver common");
+    if (end == End::kTimedOut) return fail(6, "Timed out after " + std::to_string(known_.timeout) + " seconds.");
+    due_ = {};
+    if (end == End::kStopped && stops_ == 0 && !known_.othersUseTheLoop) throw Broken{"nobody stopped the loop"};
+    return errors_ == 0;
+  }
+  // Up to the end of the loop, with what is done when it exits.
+  void readReports() {
+    for (;;) {
+      if (comes("RunLoop stop")) {
+        hear();
+        take();
+        ++stops_;
+        continue;
+      }
+      if (comes("RunLoop removeObserver common")) readStall();
+      const bool heard = !isSilent_;
+      readClosingInLoop();
+      if (!comes("RunLoop stop")) return;
+      if (!heard) throw Broken{"an error of a sensor that has been closed"};
+      take();
+      ++stops_;
+      ++errors_;
+    }
+  }
+  void readClosingInLoop() {
     try {
-      end = runLoop(limit);
-      closeStream();
-    } catch (const Stall&) {
-      sayOfLoop("removeObserver common");
+      readClosing();
+    } catch (const Broken&) {
+      if (comes("RunLoop removeObserver common")) readStall();
       throw;
     }
-    sayEndOfLoop(end);
-    sayOfLoop("removeObserver common");
-    if (end == End::kTimedOut) return fail(6, "Timed out after " + std::to_string(request_.timeout) + " seconds.");
-    error_ = asyncError_;
-    return asyncError_.empty();
   }
-  void runExperiment() {
-    const bool isSetUp = setUp();
-    say(isSetUp ? "set up" : "not set up");
-    sayError(isSetUp);
-    if (!isSetUp) return;
-    const bool captured = capture();
-    say(captured ? "returned a result" : "returned nothing");
-    sayError(captured);
-    if (!captured) return;
-    std::string list;
-    for (const std::string& image : images_) list += (list.empty() ? "" : ", ") + image;
-    say("images = (" + list + ')');
+  // A run that never returns leaves no observer behind.
+  [[noreturn]] void readStall() {
+    take();
+    if (!comes(kNeverReturned)) throw Broken{"the observer goes before the loop has ended"};
+    throw NeverReturned{take().text};
   }
 
-  // What the run has left behind: what stands on the loop, and whether the sensor goes on sending while the bench does
-  // not have it open.
-  void lookAfterwards(bool returned) {
-    stopDone_ = true;
-    loopRuns_ = false;
-    sayLeft();
-    if (returned) probeTwice();
-    sensor_.setOpen(kRun, false, now_);
-    leaveLoop();
-    sayLeft();
-    probeTwice();
+  void readExperiment() {
+    const bool isSetUp = readSetUp();
+    expect(isSetUp ? "set up" : "not set up");
+    readOutcome(isSetUp);
+    if (!isSetUp) return;
+    const bool captured = readCapture();
+    expect(captured ? "returned a result" : "returned nothing");
+    readOutcome(captured);
+    if (captured) readResult();
   }
-  void sayLeft() { say("left on the loop: " + std::to_string(scheduled_ ? 1 : 0) + " sources, 0 observers"); }
-  void probeTwice() {
+  void readResult() {
+    const std::string text = take().text;
+    std::string_view list = text;
+    takeWord(list, "images = (");
+    std::uint64_t count = 0;
+    while (!list.starts_with(")")) {
+      if (count++ > 0) takeWord(list, ", ");
+      takeImage(list);
+    }
+    takeWord(list, ")");
+    // Every image from the last one that is wanted on stops the loop.
+    const std::uint64_t wanted = std::max<std::uint64_t>(known_.images, 1);
+    if (stops_ != (count < wanted ? 0 : count - wanted + 1)) {
+      throw Broken{std::to_string(count) + " images stopped the loop " + std::to_string(stops_) + " times"};
+    }
+    if (count < wanted && wasScheduled_ && !known_.othersUseTheLoop) throw Broken{"there are too few images"};
+  }
+
+  // An image: what the sensor put into its report, and no report left out since the one before.
+  void takeImage(std::string_view& text) {
+    takeWord(text, "{frameID = ");
+    const std::uint64_t frame = takeNumber(text);
+    const std::uint64_t number = static_cast<std::uint32_t>(frame - known_.firstFrameID);
+    takeWord(text, "; " + scans(number) + "; tmonDataInC = " + kCelsius + "; timestampInMilliseconds = ");
+    const std::uint64_t milliseconds = takeNumber(text);
+    takeWord(text, "}");
+    if (milliseconds < lastMilliseconds_ || milliseconds > static_cast<std::uint64_t>(now_ / 1'000'000)) {
+      throw Broken{"an image of a time when it was not sent"};
+    }
+    lastMilliseconds_ = milliseconds;
+    if (known_.noImages.contains(number)) throw Broken{"an image of a report that holds none"};
+    if (!nextReport_ && !known_.startsInTime) nextReport_ = number;
+    std::uint64_t due = nextReport_.value_or(0);
+    while (known_.noImages.contains(due)) ++due;
+    if (number != due) throw Broken{"report " + std::to_string(due) + " is due at " + std::to_string(number)};
+    nextReport_ = number + 1;
+  }
+
+  void readStream() {
+    const bool opened = readOpening();
+    expect(opened ? "opened" : "not opened");
+    readOutcome(opened);
+    if (opened) {
+      errorIsUntouched_ = true;
+      const Time deadline = readBeginOfLoop();
+      while (!comes("RunLoop run")) readDelivery();
+      readEndOfLoop(deadline);
+    } else {
+      errorIsUntouched_ = false;
+    }
+    readClosing();
+    expect("closed");
+    readClosing();
+  }
+  void readDelivery() {
+    readIfNeverReturned();
+    if (comes("display-sensor setInputReportCallback (null)")) {
+      hear();
+      readClosing();
+      if (known_.receiver == Receiver::kNone) return;
+      std::string_view error = take().text;
+      takeWord(error, "delegate streamDidError ");
+      if (!known_.errors.contains(std::string(error))) throw Broken{"no report gave the error: " + std::string(error)};
+      return;
+    }
+    hear();
+    std::string_view image = take().text;
+    takeWord(image, "delegate handleImage ");
+    takeImage(image);
+    if (known_.receiver == Receiver::kNone) throw Broken{"an image without a receiver"};
+    if (known_.receiver == Receiver::kCloses) readClosing();
+  }
+
+  // What the run has left behind, and what is left when all of it has gone.
+  void readAfterwards() {
+    expect("left on the loop: " + std::to_string(isScheduled_ ? 1 : 0) + " sources, 0 observers");
+    if (returned_) readProbes(isOpen_);
+    expect("left on the loop: 0 sources, 0 observers");
+    readProbes(false);
+  }
+  // A sensor that nobody has open sends nothing between two probes.
+  void readProbes(bool isOpen) {
+    std::optional<std::uint64_t> last;
     for (int i = 0; i < 2; ++i) {
-      sleepUntil(now_ + 26 * period() / 10);
-      probe();
+      std::string_view seen = take().text;
+      takeWord(seen, "probe: ");
+      if (!seen.starts_with("frame ")) {
+        last.reset();
+        continue;
+      }
+      takeWord(seen, "frame ");
+      const std::uint64_t frame = takeNumber(seen);
+      if (last && !isOpen && static_cast<std::uint32_t>(frame) != static_cast<std::uint32_t>(*last + 1)) {
+        throw Broken{"the sensor goes on sending after its end"};
+      }
+      last = frame;
     }
   }
-  Time period() const { return kSecond / sensorTraits().rate; }
-  const Sensor& sensorTraits() const { return phone_.sensors.empty() ? kNoSensor : phone_.sensors.front(); }
-  void probe() {
-    if (phone_.sensors.empty() || sensor_.isGone()) return say("probe: no device");
-    benchSees_.reset();
-    sensor_.setOpen(kBench, true, now_);
-    if (sensorTraits().powerRefusal.empty()) sensor_.setActive(now_);
-    if (sensorTraits().streamingRefusal.empty()) sensor_.setImagesOnly(now_);
-    const Time deadline = now_ + 15 * period() / 10;
-    while (!benchSees_ && comesBy(deadline)) happen();
-    if (!benchSees_) now_ = deadline;
-    sensor_.setOpen(kBench, false, now_);
-    say("probe: " + (benchSees_ ? describe(*benchSees_) : "nothing"));
-  }
-  std::string describe(const Input& input) const {
-    if (!input.report.error.empty()) return input.report.error;
-    if (input.report.length < 8) return std::to_string(input.report.length) + " bytes";
-    return "frame " + std::to_string(sensorTraits().firstFrameID + static_cast<std::uint32_t>(input.number));
-  }
 
-  const Phone& phone_;
-  const Request& request_;
-  const std::vector<Failure>& failures_;
-  std::vector<std::uint64_t> taken_;
-  std::vector<std::uint64_t> fired_;
-  const bool reportsAreInTime_;
-  bool metATie_ = false;
-  bool hasPlaceForError_ = true;
+  struct DueError {
+    std::string ownText;  // "CODE: MESSAGE"; empty: the error of a report
+    bool hasCause = false;
+  };
 
-  std::string told_;
-  std::size_t calls_ = 0;
-  std::string cause_;  // of the last call
-  std::string error_;  // of the setup or the run
-
+  const Known& known_;
+  const std::vector<Line> lines_;
+  std::size_t next_ = 0;
   Time now_ = 0;
-  SensorModel sensor_;
+
+  DueError due_;
+  bool errorIsUntouched_ = true;  // where the run never returns
+  bool returned_ = true;
   bool hasDevice_ = false;
-  bool hasCallback_ = false;
-  bool scheduled_ = false;
-  std::deque<Input> waiting_;
-  bool signalled_ = false;
-  bool otherIsSignalled_ = request_.others.source.has_value();
-  bool stopDone_ = false;
-  bool loopRuns_ = false;
-  bool stopped_ = false;
-  std::optional<Input> benchSees_;
-
-  std::vector<std::string> images_;
-  std::string asyncError_;
+  bool isOpen_ = false;
+  bool isScheduled_ = false;
+  bool wasScheduled_ = false;
+  bool isSilent_ = false;
+  std::uint64_t stops_ = 0;   // of the loop, by the experiment
+  std::uint64_t errors_ = 0;  // of reports
+  std::optional<std::uint64_t> nextReport_;
+  std::uint64_t lastMilliseconds_ = 0;
 };
-
-const Sensor Run::kNoSensor{};
 
 }  // namespace
 
-std::vector<Prediction> predict(const Phone& phone, const Request& request, const std::vector<Failure>& failures,
-                                bool hasPlaceForError) {
-  Run inTime(phone, request, failures, true);
-  std::vector<Prediction> all{inTime.predict(hasPlaceForError)};
-  if (inTime.metATie()) {
-    const Prediction tooLate = Run(phone, request, failures, false).predict(hasPlaceForError);
-    if (tooLate != all.front()) all.push_back(tooLate);
+std::string brokenRule(const Known& known, const std::string& told) {
+  try {
+    Reader(known, told).read();
+  } catch (const Broken& broken) {
+    return broken.rule;
   }
-  return all;
+  return {};
 }
 
 }  // namespace quazor::sensor_oracle

@@ -4,6 +4,7 @@
 #include "backends/simulated/simulated_phone.h"
 #include "diagnostics/report_channels/tessel_telemon_experiment.h"
 #include "tests/support/run_transcript.h"
+#include "tests/support/shipped_scenario.h"
 #include "tests/sweeps/projector_bench.h"
 #include "tests/sweeps/projector_oracle.h"
 
@@ -71,7 +72,7 @@ class TelemonSweep : public testing::Test {
 };
 
 TEST_F(TelemonSweep, EveryCallMayFailOnAHealthyPhone) {
-  const Scenario scenario = readScenario(QUAZOR_SCENARIOS "/healthy.json");
+  const Scenario scenario = shippedScenario("healthy");
   ASSERT_GE(scenario.reports.size(), 60U);
   checkEveryFailure(scenario);
 }

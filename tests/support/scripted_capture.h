@@ -1,0 +1,163 @@
+// A capture service that does what a test says: for what no healthy phone would do.
+#pragma once
+
+#include "contract/message_format.h"
+#include "platform/capture_service.h"
+
+#include <functional>
+#include <memory>
+#include <optional>
+#include <set>
+#include <string>
+#include <string_view>
+#include <utility>
+
+namespace quazor {
+
+struct ScriptedCall {
+  std::string_view object;     // "service", "plug-in", or the id of a device, a group or a stream
+  std::string_view operation;  // "setValue"
+  std::string detail;          // the key of a property, KEY = VALUE of what is set, or a list of streams
+  bool succeeds = true;        // what comes of the call unless the script says otherwise
+  DiagnosticErrorPtr* error = nullptr;
+};
+
+// Decides whether a call succeeds, before it has any effect, and stores the call's error. An empty one lets every call
+// succeed that can.
+using CaptureScript = std::function<bool(const ScriptedCall& call)>;
+
+// Who asks the script. Thread: one at a time.
+class Scripted {
+ public:
+  Scripted(std::string id, CaptureScript script) : id_(std::move(id)), script_(std::move(script)) {}
+
+  const std::string& id() const { return id_; }
+  bool ask(std::string_view operation, std::string detail, bool succeeds, DiagnosticErrorPtr* error) const {
+    return script_ ? script_({id_, operation, std::move(detail), succeeds, error}) : succeeds;
+  }
+
+ private:
+  const std::string id_;
+  const CaptureScript script_;
+};
+
+// Holds whatever properties it is given; refuses to set those that it is told to refuse. Thread: one at a time.
+template <class Interface>
+class ScriptedObject : public Interface {
+ public:
+  explicit ScriptedObject(std::string id, CaptureScript script = {}) : scripted_(std::move(id), std::move(script)) {}
+
+  std::string description() const override { return scripted_.id(); }
+  std::optional<Value> valueForProperty(std::string_view key, DiagnosticErrorPtr* error) override {
+    const Value* const value = properties.find(key);
+    const bool succeeds = ask("valueForProperty", std::string(key), value != nullptr, error);
+    return succeeds && value != nullptr ? std::optional(*value) : std::nullopt;
+  }
+  bool setValue(const Value& value, std::string_view key, DiagnosticErrorPtr* error) override {
+    const bool accepted = !refused.contains(std::string(key));
+    if (!ask("setValue", std::string(key) + " = " + defaultText(value), accepted, error)) return false;
+    properties.set(key, value);
+    return true;
+  }
+
+  Dictionary properties;
+  std::set<std::string> refused;  // keys of properties, "start" and "stop"
+
+ protected:
+  bool ask(std::string_view operation, std::string detail, bool succeeds, DiagnosticErrorPtr* error) const {
+    return scripted_.ask(operation, std::move(detail), succeeds, error);
+  }
+
+ private:
+  const Scripted scripted_;
+};
+
+// Thread: one at a time.
+class ScriptedStream final : public ScriptedObject<CaptureStream> {
+ public:
+  using ScriptedObject::ScriptedObject;
+
+  bool start(DiagnosticErrorPtr* error) override { return ask("start", "", !refused.contains("start"), error); }
+  bool stop(DiagnosticErrorPtr* error) override { return ask("stop", "", !refused.contains("stop"), error); }
+};
+
+// Thread: one at a time.
+class ScriptedGroup final : public ScriptedObject<SynchronizedStreamsGroup> {
+ public:
+  using ScriptedObject::ScriptedObject;
+
+  std::optional<CaptureStreams> streams(DiagnosticErrorPtr* error) override {
+    return ask("streams", "", members.has_value(), error) ? members : std::nullopt;
+  }
+
+  std::optional<CaptureStreams> members;
+};
+
+// Thread: one at a time.
+class ScriptedDevice final : public ScriptedObject<CaptureDevice> {
+ public:
+  using ScriptedObject::ScriptedObject;
+
+  std::optional<CaptureStreams> streams(DiagnosticErrorPtr* error) override {
+    return ask("streams", "", members.has_value(), error) ? members : std::nullopt;
+  }
+  std::optional<SynchronizedStreamsGroups> synchronizedStreamsGroups(DiagnosticErrorPtr* error) override {
+    return ask("synchronizedStreamsGroups", "", true, error) ? std::optional(groups) : std::nullopt;
+  }
+  bool requestControlOfStreams(const CaptureStreams& streams, DiagnosticErrorPtr* error) override {
+    return ask("requestControlOfStreams", listOf(streams), true, error);
+  }
+  bool relinquishControlOfStreams(const CaptureStreams& streams, DiagnosticErrorPtr* error) override {
+    return ask("relinquishControlOfStreams", listOf(streams), true, error);
+  }
+  bool invalidate(DiagnosticErrorPtr* error) override { return ask("invalidate", "", true, error); }
+
+  std::optional<CaptureStreams> members;
+  SynchronizedStreamsGroups groups;
+
+ private:
+  static std::string listOf(const CaptureStreams& streams) {
+    return defaultText(Array(streams.begin(), streams.end()));
+  }
+};
+
+// Thread: one at a time.
+class ScriptedPlugIn final : public CapturePlugIn {
+ public:
+  ScriptedPlugIn(std::shared_ptr<CaptureDevice> device, CaptureScript script)
+      : device_(std::move(device)), scripted_("plug-in", std::move(script)) {}
+
+  std::string description() const override { return scripted_.id(); }
+  std::shared_ptr<CaptureDevice> device(DiagnosticErrorPtr* error) override {
+    return scripted_.ask("device", "", device_ != nullptr, error) ? device_ : nullptr;
+  }
+
+ private:
+  const std::shared_ptr<CaptureDevice> device_;
+  const Scripted scripted_;
+};
+
+// Gives a new plug-in with the device on every call. Thread: one at a time.
+class ScriptedCapture final : public CaptureService {
+ public:
+  explicit ScriptedCapture(std::shared_ptr<CaptureDevice> onlyDevice, CaptureScript script = {})
+      : device(std::move(onlyDevice)), script_(std::move(script)) {}
+
+  std::shared_ptr<CapturePlugIn> createPlugIn() override { return make("createPlugIn"); }
+  std::shared_ptr<CapturePlugIn> defaultPlugIn() override { return make("defaultPlugIn"); }
+
+  std::shared_ptr<CaptureDevice> device;  // of the plug-ins to come
+  std::weak_ptr<CapturePlugIn> lastPlugIn;
+
+ private:
+  std::shared_ptr<CapturePlugIn> make(std::string_view operation) {
+    if (!Scripted("service", script_).ask(operation, "", true, nullptr)) return nullptr;
+    auto plugIn = std::make_shared<ScriptedPlugIn>(device, script_);
+    lastPlugIn = plugIn;
+    return plugIn;
+  }
+
+  const CaptureScript script_;
+};
+
+}  // namespace quazor
