@@ -31,7 +31,7 @@ HOST = "QuazorHostErrorDomain"
 EXCEPTION, NOTHING_MEASURED, CANNOT_BE_JUDGED, CRASHED, EXITED, DEADLINE, CONNECTION_LOST = 2, 4, 5, 6, 7, 8, 9
 WELL_BEHAVED = "WellBehaved"
 LATER_CRASH = "crashAfterTheFirstTime_on_load"  # the plug-in can be loaded once
-STAGES = ("load", "describe", "setup", "run", "teardown", "analyse")
+STAGES = ("load", "describe", "setup", "run", "teardown", "analyze")
 LIMIT = 1  # seconds, of a stage that hangs
 GRACE = 0.5  # seconds, from the polite request to end to the other
 MARGIN = 3.0  # seconds, for a machine that has much else to do
@@ -102,7 +102,7 @@ def lose_connection(name, **more):
 
 def of_result(name, code, message):
     """The analysis' result is no good."""
-    return Case(name, code, message, stage="analyse")
+    return Case(name, code, message, stage="analyze")
 
 
 def on_load(way, code, message, **more):
@@ -197,24 +197,24 @@ CASES = (
     crash("CrashInRun"),
     crash("CrashInTeardown", "teardown"),
     crash("CrashInDestructor", "teardown"),
-    crash("CrashInAnalysis", "analyse"),
+    crash("CrashInAnalysis", "analyze"),
     crash("OverflowStack"),
     crash("Abort", number=6),
     crash("TerminateOnAnotherThread", number=6),
     crash("ThrowInDestructor", "teardown", number=6),
     Case("ThrowException", EXCEPTION, "run of ThrowExceptionExperiment threw an exception: the lamp is out"),
     Case("ThrowNumber", EXCEPTION, "analysis by ThrowNumberAnalysis threw something that is not a standard exception",
-         stage="analyse"),
+         stage="analyze"),
     leave("Exit"),
     leave("LeaveAtOnce"),
-    leave("LeaveWithCode", "analyse", code=7),
-    leave("LeaveWithCode", "analyse", code=7, shell=IGNORES_CHILDREN),
+    leave("LeaveWithCode", "analyze", code=7),
+    leave("LeaveWithCode", "analyze", code=7, shell=IGNORES_CHILDREN),
     hang("HangInSetup", "setup"),
     hang("HangInRun"),
     hang("BusyLoopInRun"),
     hang("HangInTeardown", "teardown"),
     hang("HangInDestructor", "teardown"),
-    hang("HangInAnalysis", "analyse"),
+    hang("HangInAnalysis", "analyze"),
     hang("HangWithoutSigterm", grace=True),
     hang("HangWithoutSignals", grace=True),
     hang("StopItself"),
@@ -405,7 +405,7 @@ class MisbehavingTest(unittest.TestCase):
         self.assertIn(f"{case.name} begins", log)
         for line in case.log:
             self.assertIn(line, log)
-        if case.stage in ("teardown", "analyse") and case.name != "EmptyResult":
+        if case.stage in ("teardown", "analyze") and case.name != "EmptyResult":
             measured = [one["measurements"] for one in events if one["event"] == "measured"]
             self.assertEqual(measured, [[["Answer", [42.0, "events"]]]])
 

@@ -5,7 +5,7 @@
 // The directory gets a file for each format, with its name. In it each run is a line with the number of its bytes, and
 // then the report.
 #include "host/error/host_error.h"
-#include "host/model/verdict_of_record.h"
+#include "host/model/judge.h"
 #include "host/report/report_format.h"
 
 #include <algorithm>
@@ -235,7 +235,7 @@ class Generator {
     const bool ran = go(Stage::kRun);
     if (ran) addMeasurements(record);
     if (oneIn(2) || failing == Stage::kTeardown) go(Stage::kTeardown);
-    return ran && !record.experimentOnly && go(Stage::kAnalyse);
+    return ran && !record.experimentOnly && go(Stage::kAnalyze);
   }
 
   void addMeasurements(DiagnosticRecord& record) {
@@ -274,9 +274,7 @@ class Generator {
       const bool wild = oneIn(6);
       const bool mayFail = oneIn(3);
       for (std::size_t i = oneIn(40) ? 300 : upTo(6); i > 0; --i) {
-        QZMeasuredResult one = result(wild, mayFail);
-        const ResultVerdict verdict = judgeResult(one).verdict;
-        record.measuredResults.push_back({std::move(one), verdict});
+        record.measuredResults.push_back(judgeResult(result(wild, mayFail)));
       }
     }
     return ended(std::move(record));

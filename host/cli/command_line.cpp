@@ -130,7 +130,7 @@ void addProcessOptions(CLI::App& command, RawOptions& raw) {
       "plug-in ends quazor");
   addRepeatable(
       command, "--deadline", raw.deadlines,
-      "Time limit for one stage (load, describe, setup, run, teardown, analyse), or for every stage; repeatable",
+      "Time limit for one stage (load, describe, setup, run, teardown, analyze), or for every stage; repeatable",
       "[STAGE=]SECONDS");
   command.add_option("--memory", raw.memory, "Memory limit for each plug-in process; default 4096")
       ->type_name("MEBIBYTES|none");

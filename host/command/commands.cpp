@@ -1,18 +1,13 @@
 #include "host/command/commands.h"
 
-#include "host/command/answer.h"
 #include "host/command/completion.h"
-#include "host/command/doctor.h"
 #include "host/command/explain_command.h"
-#include "host/command/phone_command.h"
-#include "host/command/record_commands.h"
-#include "host/command/run_command.h"
 #include "host/command/selection.h"
-#include "host/command/selftest_command.h"
 #include "host/plugin/diagnostic_registry.h"
 #include "host/record/value_json.h"
 #include "host/report/json_report.h"
 #include "host/report/text_report.h"
+#include "host/system/output_file.h"
 #include "host/text/table.h"
 
 #include <sstream>
@@ -32,11 +27,11 @@ ExitCode reportFailed(const std::vector<FailedPlugin>& failed, Console& console,
 
 ExitCode list(const Options& options, const Installation& installation, Console& console) {
   // A diagnostic's summary is known without making anything of it.
-  const auto lonely = [](std::vector<Diagnostic> all) {
+  const auto aloneAndUnused = [](std::vector<Diagnostic> all) {
     std::erase_if(all, [](const Diagnostic& one) { return !one.experimentOnly || !one.usedBy.empty(); });
     return all;
   };
-  const PluginScan survey = surveyOf(options, installation, lonely);
+  const PluginScan survey = surveyOf(options, installation, aloneAndUnused);
   std::vector<DescribedDiagnostic> listed;
   for (const DescribedDiagnostic& one : survey.catalogue) {
     if (one.diagnostic.usedBy.empty()) listed.push_back(one);
@@ -94,6 +89,15 @@ ExitCode perform(const Options& options, const Installation& installation, Conso
 }
 
 }  // namespace
+
+void writeOutput(const ReportOptions& report, Console& console, const std::string& output) {
+  if (report.output.empty()) {
+    console.out << output << std::flush;
+    if (!console.out) throw CommandError(ExitCode::kCannotWrite, "standard output cannot be written");
+    return;
+  }
+  writeOutputFile(report.output, output);
+}
 
 ExitCode runProgram(const std::vector<std::string>& arguments, const Installation& installation, Console& console) {
   if (!arguments.empty() && arguments.front() == kCompletionRequest) {

@@ -1,4 +1,4 @@
-#include "host/command/doctor.h"
+#include "host/command/commands.h"
 
 #include "contract/message_format.h"
 #include "host/command/explanations.h"

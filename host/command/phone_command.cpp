@@ -1,6 +1,5 @@
-#include "host/command/phone_command.h"
+#include "host/command/commands.h"
 
-#include "host/command/answer.h"
 #include "host/device/phone.h"
 #include "host/text/table.h"
 

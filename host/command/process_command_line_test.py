@@ -107,7 +107,7 @@ class ProcessTest(CommandLineTest):
                 self.assertIn("code 8: the stage run of Unruly exceeded its deadline of 0.2 s", result.stdout)
 
     def test_a_deadline_of_another_stage_is_not_its(self):
-        result = self.run_fake("--realtime", "--deadline", "analyse=0.05", "--deadline", "setup=0.05", duration=0.3)
+        result = self.run_fake("--realtime", "--deadline", "analyze=0.05", "--deadline", "setup=0.05", duration=0.3)
         self.assertEqual(result.returncode, 0, result.stdout)
 
     def test_deadlines_that_are_refused(self):

@@ -1,4 +1,4 @@
-"""Records as users of the program meet them: made, verified, analysed again, compared, and run from."""
+"""Records as users of the program meet them: made, verified, analyzed again, compared, and run from."""
 
 import json
 import pathlib
@@ -204,7 +204,7 @@ class AnalyzeTest(RecordTest):
         parameter, _ = events_in(record)[1]["parameters"]["analysis"]
         self.assertEqual(parameter["source"], "command line, in the record")
 
-    def test_its_record_can_be_verified_and_analysed_again(self):
+    def test_its_record_can_be_verified_and_analyzed_again(self):
         record = self.directory / "again.jsonl"
         self.assertEqual(quazor("analyze", self.record, "--set", "minimum=91", "--record", record).returncode, 1)
         self.assert_verifies(record)
@@ -243,6 +243,43 @@ class AnalyzeTest(RecordTest):
         result = quazor("analyze", self.record)
         self.assertEqual(result.returncode, 66)
         self.assertIn("contains no experiment result to analyze", result.stderr)
+
+
+class EarlierRecordTest(RecordTest):
+    """Records whose stage analyze is still written `analyse`."""
+
+    def setUp(self):
+        super().setUp()
+        self.recorded("--set", "measured=90", "--set", "minimum=90")
+        self.earlier = self.changed(self.rename)
+
+    @staticmethod
+    def rename(events):
+        analyses = [event for event in events if event.get("stage") == "analyze"]
+        assert len(analyses) >= 2
+        for event in analyses:
+            event["stage"] = "analyse"
+
+    def test_it_verifies(self):
+        self.assert_verifies(self.earlier)
+
+    def test_it_can_be_analyzed_again(self):
+        result = quazor("analyze", self.earlier, "--set", "minimum=91", "--record", self.directory / "again.jsonl")
+        self.assertEqual(result.returncode, 1, result.stderr)
+        stages = {event["stage"] for event in events_in(self.directory / "again.jsonl") if "stage" in event}
+        self.assertIn("analyze", stages)
+        self.assertNotIn("analyse", stages)
+
+    def test_it_does_not_differ_from_a_record_of_today(self):
+        result = quazor("diff", self.earlier, self.record)
+        self.assertEqual((result.returncode, result.stdout), (0, "The records do not differ.\n"))
+
+    def test_where_an_error_came_from_is_read(self):
+        self.recorded("--set", "analysis.behaviour=22", code=2)
+        failing = self.changed(self.rename)
+        self.assert_verifies(failing)
+        result = quazor("diff", failing, self.record)
+        self.assertEqual((result.returncode, result.stdout), (0, "The records do not differ.\n"))
 
 
 class DiffTest(RecordTest):

@@ -1,7 +1,6 @@
-#include "host/command/record_commands.h"
+#include "host/command/commands.h"
 
 #include "contract/message_format.h"
-#include "host/command/answer.h"
 #include "host/record/record_file.h"
 #include "host/record/verification.h"
 #include "host/report/record_difference.h"

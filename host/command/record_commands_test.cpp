@@ -1,4 +1,4 @@
-#include "host/command/record_commands.h"
+#include "host/command/commands.h"
 
 #include "host/record/record_file.h"
 #include "host/testing/test_directory.h"
@@ -18,7 +18,7 @@ class RecordCommandsTest : public testing::Test {
  protected:
   std::filesystem::path record(const std::string& name, const std::vector<RunEvent>& events) const {
     RecordWriter writer(directory_.path() / name);
-    for (const RunEvent& event : events) writer.take(event);
+    for (const RunEvent& event : events) writer.onEvent(event);
     return writer.file();
   }
 

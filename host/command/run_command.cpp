@@ -1,4 +1,4 @@
-#include "host/command/run_command.h"
+#include "host/command/commands.h"
 
 #include "contract/contract.h"
 #include "host/command/failed_only.h"
@@ -25,7 +25,7 @@ namespace {
 // What is to be done for each diagnostic.
 struct Job {
   ResolvedDiagnostic bound;
-  const QZExperimentResult* result = nullptr;  // to be analysed; null: the experiment is run
+  const QZExperimentResult* result = nullptr;  // to be analyzed; null: the experiment is run
   std::uint64_t seed = 0;
 };
 
@@ -43,12 +43,12 @@ class Conductor {
   // What the user interrupted, as RunEnded has it; nothing when the run goes on.
   std::optional<std::string> perform(const Job& job) {
     const auto& [diagnostic, description] = job.bound.described;
-    events_.take(DiagnosticStarted{diagnostic.name, job.bound.described.summary(), diagnostic.experimentName,
-                                   diagnostic.analysisName, diagnostic.experimentOnly, job.bound.parameters, job.seed,
-                                   dateNow()});
+    events_.onEvent(DiagnosticStarted{diagnostic.name, job.bound.described.summary(), diagnostic.experimentName,
+                                      diagnostic.analysisName, diagnostic.experimentOnly, job.bound.parameters,
+                                      job.seed, dateNow()});
     std::optional<std::string> interrupted;
     if (description.error != nullptr) {
-      events_.take(Failed{Stage::kDescribe, description.error});
+      events_.onEvent(Failed{Stage::kDescribe, description.error});
     } else if (inProcess_) {
       performHere(job);
     } else if (!runIsolated(isolation_, *signals_, diagnostic, job.bound.parameters, runOptions_, job.result,
@@ -65,7 +65,7 @@ class Conductor {
   void performHere(const Job& job) {
     const Diagnostic& diagnostic = job.bound.described.diagnostic;
     if (job.result != nullptr) {
-      analyseResult(diagnostic, job.bound.parameters, *job.result, runOptions_.logLevel, events_);
+      analyzeResult(diagnostic, job.bound.parameters, *job.result, runOptions_.logLevel, events_);
     } else {
       runDiagnostic(diagnostic, job.bound.parameters, runOptions_, events_);
     }
@@ -80,9 +80,9 @@ class Conductor {
 
 // A plug-in that could not be loaded stands in the report like a diagnostic.
 void tellFailedPlugin(const FailedPlugin& plugin, EventPipeline& events) {
-  events.take(DiagnosticStarted{
+  events.onEvent(DiagnosticStarted{
       plugin.file.filename().string(), "A plug-in that could not be loaded.", {}, {}, false, {}, 0, dateNow()});
-  events.take(Failed{Stage::kLoad, plugin.error});
+  events.onEvent(Failed{Stage::kLoad, plugin.error});
   events.endDiagnostic();
 }
 
@@ -131,15 +131,15 @@ ExitCode perform(const Options& options, const Installation& installation, Conso
     watcher.emplace([&events] { events.interruptAndLeave([] { ::_exit(static_cast<int>(ExitCode::kInterrupted)); }); });
   }
   Conductor conductor(withoutFailed(isolationOf(options, installation), failed), options, runOptions, events);
-  events.take(std::move(began));
+  events.onEvent(std::move(began));
   for (const FailedPlugin& plugin : failed) tellFailedPlugin(plugin, events);
   for (const Job& job : jobs) {
     if (std::optional<std::string> interrupted = conductor.perform(job)) {
-      events.take(RunEnded{std::move(interrupted), dateNow()});
+      events.onEvent(RunEnded{std::move(interrupted), dateNow()});
       return ExitCode::kInterrupted;
     }
   }
-  events.take(RunEnded{std::nullopt, dateNow()});
+  events.onEvent(RunEnded{std::nullopt, dateNow()});
   return events.exitCode();
 }
 
@@ -151,8 +151,8 @@ ExitCode performNothing(const Options& options, const Installation& installation
   EventPipeline events(eventOptions(options, false), console);
   RunStarted began = beginningOf(options, installation, {}, {});
   began.phone = options.phone.string();
-  events.take(std::move(began));
-  events.take(RunEnded{std::nullopt, dateNow()});
+  events.onEvent(std::move(began));
+  events.onEvent(RunEnded{std::nullopt, dateNow()});
   return events.exitCode();
 }
 
@@ -219,7 +219,7 @@ ExitCode analyzeCommand(const Options& given, const Installation& installation, 
   std::vector<const DiagnosticRecord*> analysable;
   for (const DiagnosticRecord& record : run.records) {
     const bool hasResult = std::any_of(record.stages.begin(), record.stages.end(),
-                                       [](const StagePeriod& one) { return one.stage == Stage::kAnalyse; });
+                                       [](const StagePeriod& one) { return one.stage == Stage::kAnalyze; });
     if (record.experimentOnly) continue;
     if (hasResult) {
       analysable.push_back(&record);

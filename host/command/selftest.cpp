@@ -35,7 +35,7 @@ std::string listText(const std::vector<std::string>& names) {
 
 std::vector<std::string> failedResultsOf(const DiagnosticRecord& record) {
   std::vector<std::string> names;
-  for (const auto& [result, verdict] : record.measuredResults) {
+  for (const auto& [result, verdict, ignored] : record.measuredResults) {
     if (verdict == ResultVerdict::kFail) names.push_back(result.name());
   }
   return names;

@@ -1,8 +1,7 @@
-#include "host/command/selftest_command.h"
+#include "host/command/commands.h"
 
 #include "base/text/nearest_name.h"
 #include "contract/message_format.h"
-#include "host/command/answer.h"
 #include "host/command/selection.h"
 #include "host/command/selftest.h"
 #include "host/model/record_builder.h"
@@ -107,8 +106,8 @@ class Selftest {
     runOptions.makePhone = phonesOfScenario(file, false, seed);
     runOptions.logLevel = LogLevel::kError;
     RecordBuilder builder;
-    builder.take(DiagnosticStarted{diagnostic.name, described.summary(), diagnostic.experimentName,
-                                   diagnostic.analysisName, diagnostic.experimentOnly, parameters, seed, dateNow()});
+    builder.onEvent(DiagnosticStarted{diagnostic.name, described.summary(), diagnostic.experimentName,
+                                      diagnostic.analysisName, diagnostic.experimentOnly, parameters, seed, dateNow()});
     progress_.start(file.stem().string(), {});
     if (options_.inProcess) {
       runDiagnostic(diagnostic, parameters, runOptions, builder);
@@ -116,7 +115,7 @@ class Selftest {
       runIsolated(isolation_, *signals_, diagnostic, parameters, runOptions, nullptr, progress_, builder);
     }
     progress_.stop();
-    for (const RunEvent& event : builder.ending(dateNow())) builder.take(event);
+    for (const RunEvent& event : builder.ending(dateNow())) builder.onEvent(event);
     return builder.takeRecord();
   }
 

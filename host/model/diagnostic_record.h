@@ -16,11 +16,6 @@
 
 namespace quazor {
 
-struct JudgedResult {
-  QZMeasuredResult result;
-  ResultVerdict verdict;
-};
-
 // How long each stage took, by the phone's clock; nothing for a stage that did not take place or did not end.
 struct StageDurations {
   std::optional<std::chrono::nanoseconds> setup;

@@ -186,13 +186,13 @@ TEST(GeneratedRuns, HaveTheVerdictOfTheOracle) {
     EventList events;
     DiagnosticStarted began = beginningOf("Scripted");
     began.experimentOnly = script.experimentOnly;
-    events.take(began);
+    events.onEvent(began);
     runDiagnostic(diagnosticOf(script), {}, options, events);
     RecordBuilder builder;
     for (const RunEvent& event : events.events) {
       // As long as the plug-in's part is not over there is no verdict but an error.
       ASSERT_EQ(std::get<DiagnosticEnded>(builder.ending({}).back()).verdict, Verdict::kError) << i;
-      builder.take(event);
+      builder.onEvent(event);
     }
     ASSERT_TRUE(builder.isCompleted()) << i;
     const auto ended = std::get<DiagnosticEnded>(builder.ending({}).back());

@@ -1,6 +1,7 @@
 #include "host/model/judge.h"
 
 #include "contract/message_format.h"
+#include "host/model/diagnostic_record.h"
 
 #include <cmath>
 #include <utility>
@@ -70,16 +71,18 @@ std::string_view nameOf(Verdict verdict) {
   return "error";
 }
 
-ResultJudgement judgeResult(const QZMeasuredResult& result) {
+JudgedResult judgeResult(QZMeasuredResult result) {
   const std::optional<QZLimit>& limit = result.limit();
-  if (!limit || (limit->lowerBound() == nullptr && limit->upperBound() == nullptr)) return {};
+  if (!limit || (limit->lowerBound() == nullptr && limit->upperBound() == nullptr)) return {std::move(result)};
   if (const std::string problem = problemOfLimit(*limit, result.measurement()); !problem.empty()) {
-    return {ResultVerdict::kFail, formatMessage("the result %@ cannot be judged: %@", result.name(), problem)};
+    std::string text = formatMessage("the result %@ cannot be judged: %@", result.name(), problem);
+    return {std::move(result), ResultVerdict::kFail, std::move(text)};
   }
-  return {isInside(*limit, result.measurement().value()) ? ResultVerdict::kPass : ResultVerdict::kFail, {}};
+  const bool inside = isInside(*limit, result.measurement().value());
+  return {std::move(result), inside ? ResultVerdict::kPass : ResultVerdict::kFail};
 }
 
-Judgement judge(const std::vector<QZMeasuredResult>& results) {
+Judgement judge(const std::vector<JudgedResult>& results) {
   Judgement judgement;
   if (results.empty()) {
     judgement.problemCode = HostErrorCode::kNothingMeasured;
@@ -87,17 +90,26 @@ Judgement judge(const std::vector<QZMeasuredResult>& results) {
     return judgement;
   }
   judgement.verdict = Verdict::kPass;
-  for (const QZMeasuredResult& result : results) {
-    ResultJudgement one = judgeResult(result);
-    judgement.results.push_back(one.verdict);
+  for (const JudgedResult& one : results) {
     if (one.verdict == ResultVerdict::kFail && judgement.verdict == Verdict::kPass) judgement.verdict = Verdict::kFail;
     if (!one.problem.empty() && judgement.problem.empty()) {
       judgement.problemCode = HostErrorCode::kCannotBeJudged;
-      judgement.problem = std::move(one.problem);
+      judgement.problem = one.problem;
     }
   }
   if (judgement.problemCode) judgement.verdict = Verdict::kError;
   return judgement;
+}
+
+RecordJudgement judgeRecord(const DiagnosticRecord& record, bool completed) {
+  if (record.error != nullptr) return {Verdict::kError, record.error};
+  if (!completed) {
+    return {Verdict::kError, hostError(HostErrorCode::kConnectionLost, "the run was not completed")};
+  }
+  if (record.experimentOnly) return {Verdict::kPass, nullptr};
+  const Judgement judgement = judge(record.measuredResults);
+  if (!judgement.problemCode) return {judgement.verdict, nullptr};
+  return {Verdict::kError, hostError(*judgement.problemCode, judgement.problem)};
 }
 
 }  // namespace quazor

@@ -1,12 +1,10 @@
 #include "host/model/record_builder.h"
 
-#include "host/model/verdict_of_record.h"
-
 #include <utility>
 
 namespace quazor {
 
-void RecordBuilder::take(const RunEvent& event) {
+void RecordBuilder::onEvent(const RunEvent& event) {
   std::visit([this](const auto& one) { fold(one); }, event);
 }
 
@@ -54,7 +52,7 @@ void RecordBuilder::fold(const StageEnded& event) {
   if (event.stage == Stage::kSetup) durations.setup = event.duration;
   if (event.stage == Stage::kRun) durations.run = event.duration;
   if (event.stage == Stage::kTeardown) durations.teardown = event.duration;
-  if (event.stage == Stage::kAnalyse) durations.analysis = event.duration;
+  if (event.stage == Stage::kAnalyze) durations.analysis = event.duration;
 }
 
 void RecordBuilder::fold(const Logged& event) { record_.log.push_back(event.line); }
@@ -66,9 +64,7 @@ void RecordBuilder::fold(const MeasurementsAdded& event) {
 void RecordBuilder::fold(const AuxiliaryDataAdded& event) { record_.auxiliaryData.set(event.key, event.value); }
 
 void RecordBuilder::fold(const ResultsReported& event) {
-  for (const QZMeasuredResult& result : event.results) {
-    record_.measuredResults.push_back({result, judgeResult(result).verdict});
-  }
+  for (const QZMeasuredResult& result : event.results) record_.measuredResults.push_back(judgeResult(result));
 }
 
 void RecordBuilder::fold(const Failed& event) {

@@ -13,7 +13,7 @@ namespace quazor {
 // Thread: one at a time.
 class RecordBuilder final : public RunEventSink {
  public:
-  void take(const RunEvent& event) override;
+  void onEvent(const RunEvent& event) override;
 
   // True from DiagnosticStarted to DiagnosticEnded.
   bool isOpen() const { return open_; }

@@ -16,7 +16,7 @@ using namespace std::chrono_literals;
 class RecordBuilderTest : public testing::Test {
  protected:
   void takeAll(const std::vector<RunEvent>& events) {
-    for (const RunEvent& event : events) builder_.take(event);
+    for (const RunEvent& event : events) builder_.onEvent(event);
   }
 
   void close() { takeAll(builder_.ending(momentAt(90))); }
@@ -58,8 +58,8 @@ TEST_F(RecordBuilderTest, FoldsEverythingThatADiagnosticTells) {
 
 TEST_F(RecordBuilderTest, TimesTeardownAndAnalysis) {
   takeAll({beginningOf("A"), StageStarted{Stage::kTeardown, momentAt(2)},
-           StageEnded{Stage::kTeardown, 5ns, momentAt(3)}, StageStarted{Stage::kAnalyse, momentAt(4)},
-           StageEnded{Stage::kAnalyse, 6ns, momentAt(5)}});
+           StageEnded{Stage::kTeardown, 5ns, momentAt(3)}, StageStarted{Stage::kAnalyze, momentAt(4)},
+           StageEnded{Stage::kAnalyze, 6ns, momentAt(5)}});
   EXPECT_EQ(builder_.record().durations.teardown, 5ns);
   EXPECT_EQ(builder_.record().durations.analysis, 6ns);
   EXPECT_EQ(builder_.record().durations.setup, std::nullopt);
@@ -69,20 +69,20 @@ TEST_F(RecordBuilderTest, TimesTeardownAndAnalysis) {
 TEST_F(RecordBuilderTest, KnowsWhatIsOpen) {
   EXPECT_FALSE(builder_.isOpen());
   EXPECT_EQ(builder_.stage(), std::nullopt);
-  builder_.take(runOf({"A"}));
+  builder_.onEvent(runOf({"A"}));
   EXPECT_FALSE(builder_.isOpen());
   takeAll({beginningOf("A"), StageStarted{Stage::kSetup, momentAt(2)}});
   EXPECT_TRUE(builder_.isOpen());
   EXPECT_FALSE(builder_.isCompleted());
   EXPECT_EQ(builder_.stage(), Stage::kSetup);
-  builder_.take(StageEnded{Stage::kSetup, 0ns, momentAt(3)});
+  builder_.onEvent(StageEnded{Stage::kSetup, 0ns, momentAt(3)});
   EXPECT_EQ(builder_.stage(), std::nullopt);
-  builder_.take(DiagnosticCompleted{});
+  builder_.onEvent(DiagnosticCompleted{});
   EXPECT_TRUE(builder_.isCompleted());
   EXPECT_TRUE(builder_.isOpen());
-  builder_.take(DiagnosticEnded{Verdict::kError, momentAt(4)});
+  builder_.onEvent(DiagnosticEnded{Verdict::kError, momentAt(4)});
   EXPECT_FALSE(builder_.isOpen());
-  builder_.take(RunEnded{std::nullopt, momentAt(5)});
+  builder_.onEvent(RunEnded{std::nullopt, momentAt(5)});
   EXPECT_EQ(builder_.record().end, momentAt(4));
 }
 
@@ -94,7 +94,7 @@ TEST_F(RecordBuilderTest, LeavesAStageOpenWhenAnotherOneEnds) {
 
 TEST_F(RecordBuilderTest, BeginsEachDiagnosticAnew) {
   takeAll(wholeDiagnostic("A", 90));
-  builder_.take(beginningOf("B"));
+  builder_.onEvent(beginningOf("B"));
   EXPECT_EQ(builder_.record().name, "B");
   EXPECT_TRUE(builder_.record().measuredResults.empty());
   EXPECT_TRUE(builder_.record().stages.empty());
@@ -104,7 +104,7 @@ TEST_F(RecordBuilderTest, BeginsEachDiagnosticAnew) {
 TEST_F(RecordBuilderTest, KeepsTheFirstFailure) {
   const DiagnosticErrorPtr first = errorWithMessage("D", 1, "first", nullptr);
   takeAll({beginningOf("A"), Failed{Stage::kTeardown, first},
-           Failed{Stage::kAnalyse, errorWithMessage("D", 2, "second", nullptr)}});
+           Failed{Stage::kAnalyze, errorWithMessage("D", 2, "second", nullptr)}});
   EXPECT_EQ(builder_.record().error, first);
   EXPECT_EQ(builder_.record().errorStage, Stage::kTeardown);
 }
@@ -138,7 +138,7 @@ TEST_F(RecordBuilderTest, EndsWithTheVerdictThatFollows) {
        Verdict::kError},
   };
   for (const Row& row : rows) {
-    builder_.take(beginningOf("A"));
+    builder_.onEvent(beginningOf("A"));
     takeAll(row.events);
     const std::vector<RunEvent> ending = builder_.ending(momentAt(9));
     EXPECT_EQ(namesOf(ending), row.ending) << row.name;

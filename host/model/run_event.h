@@ -104,7 +104,7 @@ class RunEventSink {
   RunEventSink& operator=(const RunEventSink&) = delete;
   virtual ~RunEventSink() = default;
 
-  virtual void take(const RunEvent& event) = 0;
+  virtual void onEvent(const RunEvent& event) = 0;
 };
 
 }  // namespace quazor

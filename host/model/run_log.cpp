@@ -22,7 +22,7 @@ RunLog::RunLog(std::shared_ptr<const Clock> clock, RunEventSink& events)
 void RunLog::write(LogLevel level, std::string_view /*subsystem*/, std::string_view /*category*/,
                    std::string_view text) {
   const std::lock_guard lock(mutex_);
-  if (events_ != nullptr) events_->take(Logged{{clock_->now() - begin_, level, std::string(text), dateNow()}});
+  if (events_ != nullptr) events_->onEvent(Logged{{clock_->now() - begin_, level, std::string(text), dateNow()}});
 }
 
 void RunLog::close() {

@@ -2,6 +2,12 @@
 
 namespace quazor {
 
+namespace {
+
+constexpr std::string_view kFormerAnalyzeName = "analyse";
+
+}  // namespace
+
 std::string_view nameOf(Stage stage) {
   switch (stage) {
     case Stage::kLoad: return "load";
@@ -9,12 +15,13 @@ std::string_view nameOf(Stage stage) {
     case Stage::kSetup: return "setup";
     case Stage::kRun: return "run";
     case Stage::kTeardown: return "teardown";
-    case Stage::kAnalyse: break;
+    case Stage::kAnalyze: break;
   }
-  return "analyse";
+  return "analyze";
 }
 
 std::optional<Stage> stageNamed(std::string_view name) {
+  if (name == kFormerAnalyzeName) return Stage::kAnalyze;
   for (const Stage stage : kStages) {
     if (nameOf(stage) == name) return stage;
   }

@@ -44,7 +44,7 @@ class NamesNotPassedTest : public testing::Test {
     const std::filesystem::path file = directory_.path() / "record";
     {
       RecordWriter writer(file);
-      for (const RunEvent& event : events) writer.take(event);
+      for (const RunEvent& event : events) writer.onEvent(event);
     }
     return failedNames(runIn(file));
   }

@@ -88,7 +88,7 @@ RecordWriter::RecordWriter(std::filesystem::path file) : file_(std::move(file)) 
 
 RecordWriter::~RecordWriter() { ::close(descriptor_); }
 
-void RecordWriter::take(const RunEvent& event, const std::string& line) {
+void RecordWriter::onEvent(const RunEvent& event, const std::string& line) {
   ++taken_;
   if (!problem_.empty()) return;
   write(line);
@@ -139,7 +139,7 @@ RecordedRun runIn(const std::filesystem::path& file) {
   RecordedRun run;
   RecordBuilder builder;
   for (const RunEvent& event : stored.events) {
-    builder.take(event);
+    builder.onEvent(event);
     if (const auto* const began = std::get_if<RunStarted>(&event)) run.began = *began;
     if (const auto* const ended = std::get_if<RunEnded>(&event)) run.ended = *ended;
     if (std::holds_alternative<DiagnosticEnded>(event)) run.records.push_back(builder.takeRecord());

@@ -16,7 +16,7 @@ inline constexpr int kRecordFormat = 1;
 // The line of a record that holds the event, with the line's end. `sequence` is the number of events before it.
 std::string recordLine(const RunEvent& event, std::uint64_t sequence);
 
-// Writes a record while the run goes on. A line is handed to the system as a whole before take() returns, so that
+// Writes a record while the run goes on. A line is handed to the system as a whole before onEvent() returns, so that
 // what has been taken is in the file whatever happens to this process, and a file that was cut off ends in a line
 // without an end.
 // Thread: one at a time.
@@ -28,9 +28,9 @@ class RecordWriter final : public RunEventSink {
   ~RecordWriter() override;
 
   // After a failure nothing more is written.
-  void take(const RunEvent& event) override { take(event, recordLine(event, taken_)); }
+  void onEvent(const RunEvent& event) override { onEvent(event, recordLine(event, taken_)); }
   // The same for who has the line already: it is the event's in all records of one run.
-  void take(const RunEvent& event, const std::string& line);
+  void onEvent(const RunEvent& event, const std::string& line);
 
   const std::filesystem::path& file() const { return file_; }
   // Why something could not be written; the empty text when all was.

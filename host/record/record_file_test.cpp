@@ -53,7 +53,7 @@ class RecordFileTest : public testing::Test {
  protected:
   void write(const std::vector<RunEvent>& events) const {
     RecordWriter writer(file_);
-    for (const RunEvent& event : events) writer.take(event);
+    for (const RunEvent& event : events) writer.onEvent(event);
     EXPECT_EQ(writer.problem(), "");
   }
 
@@ -91,7 +91,7 @@ TEST_F(RecordFileTest, HoldsEachEventAsSoonAsItWasTaken) {
   EXPECT_EQ(writer.file(), file_);
   std::size_t taken = 0;
   for (const RunEvent& event : wholeRun()) {
-    writer.take(event);
+    writer.onEvent(event);
     const std::string text = directory_.read("record");
     EXPECT_EQ(std::count(text.begin(), text.end(), '\n'), static_cast<std::ptrdiff_t>(++taken));
     EXPECT_EQ(text.back(), '\n');
@@ -199,7 +199,7 @@ TEST_F(RecordFileTest, WritesToWhatIsNoRegularFileAsItIs) {
   const int reader = ::open(file_.c_str(), O_RDONLY | O_NONBLOCK);
   ASSERT_GE(reader, 0);
   RecordWriter writer(file_);
-  writer.take(runOf({}));
+  writer.onEvent(runOf({}));
   char text[13] = {};
   EXPECT_EQ(::read(reader, text, 12), 12);
   EXPECT_STREQ(text, "{\"sequence\":");
@@ -224,9 +224,9 @@ TEST_F(RecordFileTest, RefusesAFileThatCannotBeMade) {
 TEST_F(RecordFileTest, TellsWhyItCouldNotBeWrittenAndWritesNoMore) {
   RecordWriter writer("/dev/full");
   EXPECT_EQ(writer.problem(), "");
-  writer.take(runOf({}));
+  writer.onEvent(runOf({}));
   EXPECT_EQ(writer.problem(), "No space left on device");
-  writer.take(RunEnded{std::nullopt, momentAt(1)});
+  writer.onEvent(RunEnded{std::nullopt, momentAt(1)});
   EXPECT_EQ(writer.problem(), "No space left on device");
 }
 
@@ -237,7 +237,7 @@ TEST_F(RecordFileTest, EndsInACutOffLineWhenTheDiskIsFull) {
   RecordWriter writer(file_);
   const rlimit small{700, before.rlim_max};  // octets that a file may have
   ASSERT_EQ(setrlimit(RLIMIT_FSIZE, &small), 0);
-  for (const RunEvent& event : wholeRun()) writer.take(event);
+  for (const RunEvent& event : wholeRun()) writer.onEvent(event);
   setrlimit(RLIMIT_FSIZE, &before);
   std::signal(SIGXFSZ, handler);
   EXPECT_EQ(writer.problem(), "File too large");

@@ -3,7 +3,6 @@
 #include "contract/message_format.h"
 #include "host/error/host_error.h"
 #include "host/model/record_builder.h"
-#include "host/model/verdict_of_record.h"
 
 #include <algorithm>
 #include <cstdint>
@@ -26,15 +25,15 @@ std::string textOf(const DiagnosticErrorPtr& error) {
 
 class Verifier {
  public:
-  void take(const RunEvent& event) {
+  void onEvent(const RunEvent& event) {
     if (const auto* const failed = std::get_if<Failed>(&event); failed != nullptr && !failed->stage) {
-      hostsWord_ = failed->error;  // the host's own, which must follow from the rest
+      hostError_ = failed->error;  // the host's own, which must follow from the rest
       if (!builder_.isOpen()) add("a failure is recorded outside of any diagnostic");
       return;
     }
     checkPlace(event);
-    builder_.take(event);
-    if (std::holds_alternative<DiagnosticStarted>(event)) hostsWord_ = nullptr;
+    builder_.onEvent(event);
+    if (std::holds_alternative<DiagnosticStarted>(event)) hostError_ = nullptr;
     if (std::holds_alternative<DiagnosticEnded>(event)) checkVerdict();
   }
 
@@ -70,11 +69,11 @@ class Verifier {
     run_.push_back(record.name);
     RecordJudgement judged = judgeRecord(record, builder_.isCompleted());
     const DiagnosticErrorPtr due = record.error == nullptr ? judged.error : nullptr;
-    if (hostsWord_ != nullptr && isNotRecorded(*hostsWord_)) {
+    if (hostError_ != nullptr && isNotRecorded(*hostError_)) {
       judged.verdict = Verdict::kError;
-    } else if (textOf(hostsWord_) != textOf(due)) {
+    } else if (textOf(hostError_) != textOf(due)) {
       add(formatMessage("%@: the recorded error of quazor is %@, but the results, limits and errors give %@",
-                        record.name, textOf(hostsWord_), textOf(due)));
+                        record.name, textOf(hostError_), textOf(due)));
     }
     if (judged.verdict != record.verdict) {
       add(formatMessage("%@: the recorded verdict is %@, but the results, limits and errors give %@", record.name,
@@ -85,7 +84,7 @@ class Verifier {
   void add(std::string problem) { problems.push_back(std::move(problem)); }
 
   RecordBuilder builder_;
-  DiagnosticErrorPtr hostsWord_;
+  DiagnosticErrorPtr hostError_;
   std::vector<std::string> toRun_;
   std::vector<std::string> run_;
   bool began_ = false;
@@ -96,7 +95,7 @@ class Verifier {
 
 std::vector<std::string> problemsOf(const std::vector<RunEvent>& events) {
   Verifier verifier;
-  for (const RunEvent& event : events) verifier.take(event);
+  for (const RunEvent& event : events) verifier.onEvent(event);
   return std::move(verifier.problems);
 }
 

@@ -33,7 +33,7 @@ Json limitJson(const std::optional<QZLimit>& limit) {
 
 Json resultsJson(const std::vector<JudgedResult>& results) {
   Json json = Json::array();
-  for (const auto& [result, verdict] : results) {
+  for (const auto& [result, verdict, ignored] : results) {
     json.push_back({{"name", result.name()},
                     {"value", numberJson(result.measurement().value())},
                     {"unit", result.measurement().unit().symbol()},

@@ -44,7 +44,7 @@ TEST(RecordJson, HasNoErrorWithAnotherVerdict) {
 TEST(RecordJson, WritesNumbersThatJsonDoesNotHaveAsText) {
   DiagnosticRecord record = recordOf("Name", Verdict::kError);
   const double nan = std::numeric_limits<double>::quiet_NaN();
-  record.measuredResults = {{resultWithMinimum(nan, -std::numeric_limits<double>::infinity()), ResultVerdict::kFail}};
+  record.measuredResults = {judgeResult(resultWithMinimum(nan, -std::numeric_limits<double>::infinity()))};
   const Json result = recordJson(record)["measuredResults"][0];
   EXPECT_EQ(result["value"], "nan");
   EXPECT_EQ(result["limit"]["lower"]["value"], "-inf");
@@ -56,7 +56,7 @@ TEST(RecordJson, SaysWhetherABoundIsOpen) {
   QZLimit limit("L");
   limit.setUpperBound(std::make_shared<const QZBound>(Measurement(2, QZDimensionlessUnit::frames()), true));
   result.setLimit(limit);
-  record.measuredResults = {{result, ResultVerdict::kPass}};
+  record.measuredResults = {judgeResult(result)};
   EXPECT_EQ(recordJson(record)["measuredResults"][0]["limit"],
             Json::parse(R"({"name": "L", "lower": null, "upper": {"value": 2.0, "open": true}})"));
 }

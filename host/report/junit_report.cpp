@@ -50,8 +50,8 @@ void addResult(JUnitSuite& suite, const JudgedResult& judged) {
   const QZMeasuredResult& result = judged.result;
   const JUnitProperties properties = propertiesOf(judged);
   if (judged.verdict != ResultVerdict::kFail) return suite.addPass(result.name(), properties);
-  if (const std::string problem = judgeResult(result).problem; !problem.empty()) {
-    return suite.addError(result.name(), properties, hostError(HostErrorCode::kCannotBeJudged, problem));
+  if (!judged.problem.empty()) {
+    return suite.addError(result.name(), properties, hostError(HostErrorCode::kCannotBeJudged, judged.problem));
   }
   suite.addFailure(
       result.name(), properties,

@@ -99,7 +99,7 @@ TEST(JUnitReport, HasTheJudgesErrorBesideTheResults) {
 
 TEST(JUnitReport, CallsAResultThatCannotBeJudgedAnError) {
   DiagnosticRecord unjudged = record(Verdict::kError);
-  unjudged.measuredResults = {{resultWithMinimum(std::numeric_limits<double>::quiet_NaN(), 1), ResultVerdict::kFail}};
+  unjudged.measuredResults = {judgeResult(resultWithMinimum(std::numeric_limits<double>::quiet_NaN(), 1))};
   EXPECT_THAT(reportOf(unjudged),
               AllOf(HasSubstr("tests=\"2\" failures=\"0\" errors=\"2\""),
                     HasSubstr("<error message=\"the result Count cannot be judged: its value is nan\" "
@@ -112,7 +112,7 @@ TEST(JUnitReport, HasBothBoundsOfALimit) {
   limit.setUpperBound(std::make_shared<const QZBound>(Measurement(2.5, QZDimensionlessUnit::frames()), true));
   result.setLimit(limit);
   DiagnosticRecord passed = record(Verdict::kPass);
-  passed.measuredResults = {{result, ResultVerdict::kPass}};
+  passed.measuredResults = {judgeResult(result)};
   EXPECT_THAT(reportOf(passed), AllOf(HasSubstr("<property name=\"upper\" value=\"2.5\"/>\n"
                                                 "        <property name=\"upperOpen\" value=\"true\"/>"),
                                       Not(HasSubstr("name=\"lower"))));

@@ -122,12 +122,12 @@ void addBound(Json& limit, const char* key, const std::shared_ptr<const QZBound>
 
 // Validators compare numbers and know no units. A limit that a result cannot be judged by, and one without a bound,
 // stand in the metadata.
-Json resultJson(const QZMeasuredResult& result) {
+Json resultJson(const JudgedResult& judged) {
+  const QZMeasuredResult& result = judged.result;
   Json json = measurementJson(result.name(), result.measurement());
   if (!result.limit()) return json;
   const QZLimit& limit = *result.limit();
-  const ResultJudgement judgement = judgeResult(result);
-  if (judgement.verdict != ResultVerdict::kNone && judgement.problem.empty()) {
+  if (judged.verdict != ResultVerdict::kNone && judged.problem.empty()) {
     Json validators = Json::array();
     addValidator(validators, limit, limit.lowerBound(), "GREATER_THAN_OR_EQUAL", "GREATER_THAN");
     addValidator(validators, limit, limit.upperBound(), "LESS_THAN_OR_EQUAL", "LESS_THAN");
@@ -138,7 +138,7 @@ Json resultJson(const QZMeasuredResult& result) {
   addBound(unused, "lower", limit.lowerBound());
   addBound(unused, "upper", limit.upperBound());
   json["metadata"] = {{"limit", std::move(unused)}};
-  addText(json["metadata"], "problem", judgement.problem);
+  addText(json["metadata"], "problem", judged.problem);
   return json;
 }
 
@@ -207,8 +207,8 @@ class RecordWriter {
     stream_.addToStep(step, "testStepEnd", {{"status", hasError || failed ? "ERROR" : "COMPLETE"}}, stepEnd_);
   }
 
-  static bool isOfExperiment(Stage stage) { return stage != Stage::kLoad && stage != Stage::kAnalyse; }
-  static bool isOfAnalysis(Stage stage) { return stage == Stage::kAnalyse; }
+  static bool isOfExperiment(Stage stage) { return stage != Stage::kLoad && stage != Stage::kAnalyze; }
+  static bool isOfAnalysis(Stage stage) { return stage == Stage::kAnalyze; }
 
   void writeExperiment() {
     const std::vector<StagePeriod> stages = stagesThat(isOfExperiment);
@@ -251,12 +251,12 @@ class RecordWriter {
     beginStep(kAnalysisStep, record_.analysisName, stages);
     const bool known = record_.verdict != Verdict::kError;
     for (const JudgedResult& one : record_.measuredResults) {
-      stream_.addToStep(kAnalysisStep, "measurement", resultJson(one.result), stepEnd_);
+      stream_.addToStep(kAnalysisStep, "measurement", resultJson(one), stepEnd_);
       if (one.verdict == ResultVerdict::kNone) continue;
       stream_.addToStep(kAnalysisStep, "diagnosis", diagnosisJson(one, known), stepEnd_);
     }
     // The judge's error is this step's too. An analysis whose error came after another one has left no result.
-    const bool hasError = !known && !errorIsWritten_ && record_.errorStage.value_or(Stage::kAnalyse) == Stage::kAnalyse;
+    const bool hasError = !known && !errorIsWritten_ && record_.errorStage.value_or(Stage::kAnalyze) == Stage::kAnalyze;
     endStep(kAnalysisStep, hasError, !known && record_.measuredResults.empty());
   }
 

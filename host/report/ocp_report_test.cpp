@@ -41,7 +41,7 @@ DiagnosticRecord fullRecord(Verdict verdict) {
   record.begin = kStart;
   record.log.clear();
   Date date = kStart;
-  for (const Stage stage : {Stage::kDescribe, Stage::kSetup, Stage::kRun, Stage::kTeardown, Stage::kAnalyse}) {
+  for (const Stage stage : {Stage::kDescribe, Stage::kSetup, Stage::kRun, Stage::kTeardown, Stage::kAnalyze}) {
     record.stages.push_back({stage, date + 1s, date + 2s});
     date += 2s;
   }
@@ -113,7 +113,7 @@ std::shared_ptr<const QZBound> boundOf(double value, bool open, const QZUnit& un
 // The artifact of a record's one measured result.
 Json measurementOf(const QZMeasuredResult& result) {
   DiagnosticRecord record = fullRecord(Verdict::kError);
-  record.measuredResults = {{result, judgeResult(result).verdict}};
+  record.measuredResults = {judgeResult(result)};
   return allOf(artifactsOf(record), "measurement", "analysis").at(0);
 }
 
@@ -261,7 +261,7 @@ TEST(OcpReport, HasADiagnosisForEachLimitedResult) {
 TEST(OcpReport, KnowsNothingOfTheHardwareWithAnError) {
   DiagnosticRecord record = fullRecord(Verdict::kError);
   record.errorStage = Stage::kTeardown;
-  record.measuredResults.push_back({resultWithMinimum(1, 2), ResultVerdict::kFail});
+  record.measuredResults.push_back(judgeResult(resultWithMinimum(1, 2)));
   const std::vector<Artifact> artifacts = artifactsOf(record);
   std::vector<std::string> types;
   for (const Json& one : allOf(artifacts, "diagnosis")) types.push_back(one["type"]);
@@ -292,7 +292,7 @@ TEST(OcpReport, HasTheErrorInTheStepThatItCameFrom) {
       {"setup", Stage::kSetup, "experiment", "ERROR", ""},
       {"run", Stage::kRun, "experiment", "ERROR", ""},
       {"teardown", Stage::kTeardown, "experiment", "ERROR", "COMPLETE"},
-      {"analyse", Stage::kAnalyse, "analysis", "COMPLETE", "ERROR"},
+      {"analyze", Stage::kAnalyze, "analysis", "COMPLETE", "ERROR"},
       {"the judge", std::nullopt, "analysis", "COMPLETE", "ERROR"},
   };
   for (const ErrorRow& row : kRows) {

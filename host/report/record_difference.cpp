@@ -45,7 +45,7 @@ Facts factsOf(const DiagnosticRecord& record) {
   for (const auto& [name, measurement] : record.measurements) {
     setFact(facts, "measurement " + name, measurementText(measurement));
   }
-  for (const auto& [result, verdict] : record.measuredResults) {
+  for (const auto& [result, verdict, ignored] : record.measuredResults) {
     setFact(
         facts, "result " + result.name(),
         formatMessage("%@, %@, %@", measurementText(result.measurement()), limitText(result.limit()), nameOf(verdict)));

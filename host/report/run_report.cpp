@@ -12,8 +12,7 @@ namespace quazor {
 RunReport::RunReport(ReportOptions options, Console& console)
     : options_(std::move(options)), console_(console), progress_(console.showsProgress ? &console.err : nullptr) {}
 
-void RunReport::take(const RunEvent& event) {
-  builder_.take(event);
+void RunReport::onEvent(const RunEvent& event) {
   if (const auto* const began = std::get_if<RunStarted>(&event)) {
     run_ = *began;
   } else if (const auto* const diagnostic = std::get_if<DiagnosticStarted>(&event)) {
@@ -25,16 +24,13 @@ void RunReport::take(const RunEvent& event) {
       console_.err << readableLogLine(line.date, line.level, sharedLog().category(), printableLines(line.text))
                    << std::flush;
     });
-  } else if (std::holds_alternative<DiagnosticEnded>(event)) {
-    finishDiagnostic();
   } else if (const auto* const ended = std::get_if<RunEnded>(&event)) {
     finishRun(*ended);
   }
 }
 
-void RunReport::finishDiagnostic() {
+void RunReport::addRecord(DiagnosticRecord record) {
   progress_.stop();
-  DiagnosticRecord record = builder_.takeRecord();
   if (!options_.output.empty()) {
     printVerdict(console_.out, record, console_.colour);
   } else if (options_.format == Format::kText) {

@@ -3,7 +3,7 @@
 
 #include "contract/log_channel.h"
 #include "host/error/exit_code.h"
-#include "host/model/record_builder.h"
+#include "host/model/diagnostic_record.h"
 #include "host/model/run_event.h"
 #include "host/report/progress.h"
 #include "host/report/report_format.h"
@@ -41,7 +41,9 @@ class RunReport final : public RunEventSink {
   // `console` is borrowed.
   RunReport(ReportOptions options, Console& console);
 
-  void take(const RunEvent& event) override;
+  void onEvent(const RunEvent& event) override;
+  // Hands over the record of the diagnostic that has ended.
+  void addRecord(DiagnosticRecord record);
 
   // What the run came to, once it has ended: kCannotWrite when not all reports could be written.
   ExitCode exitCode() const;
@@ -49,14 +51,12 @@ class RunReport final : public RunEventSink {
   Progress& progress() { return progress_; }
 
  private:
-  void finishDiagnostic();
   void finishRun(const RunEnded& event);
   void writeFile(const OutputRequest& output, const std::optional<std::string>& interrupted);
 
   const ReportOptions options_;
   Console& console_;
   Progress progress_;
-  RecordBuilder builder_;
   RunStarted run_;
   std::vector<DiagnosticRecord> records_;
   bool allWritten_ = true;

@@ -18,30 +18,8 @@ using testing::HasSubstr;
 using testing::Not;
 using Json = nlohmann::ordered_json;
 
-// The events of a diagnostic whose record is this one.
-std::vector<RunEvent> eventsOf(const DiagnosticRecord& record) {
-  DiagnosticStarted began = beginningOf(record.name);
-  began.experimentOnly = record.experimentOnly;
-  began.parameters = record.parameters;
-  ResultsReported found;
-  for (const JudgedResult& one : record.measuredResults) found.results.push_back(one.result);
-  MeasurementsAdded measured;
-  for (const auto& one : record.measurements) measured.measurements.push_back(one);
-  std::vector<RunEvent> events = {began, measured, found};
-  for (const auto& [key, value] : record.auxiliaryData) events.emplace_back(AuxiliaryDataAdded{key, value});
-  for (const LogLine& line : record.log) events.emplace_back(Logged{line});
-  if (record.error != nullptr) events.emplace_back(Failed{Stage::kRun, record.error});
-  events.emplace_back(FaultsCounted{record.faults});
-  events.emplace_back(DiagnosticEnded{record.verdict, momentAt(9)});
-  return events;
-}
-
 class RunReportTest : public testing::Test {
  protected:
-  static void takeAll(RunReport& report, const std::vector<RunEvent>& events) {
-    for (const RunEvent& event : events) report.take(event);
-  }
-
   // The record of a diagnostic, or of an experiment, of that verdict, without log lines.
   DiagnosticRecord quietRecord(const std::string& name, Verdict verdict) const {
     DiagnosticRecord record = recordOf(name, verdict);
@@ -58,16 +36,16 @@ class RunReportTest : public testing::Test {
   void run(RunReport& report, const std::vector<Verdict>& verdicts) const {
     RunStarted began = runOf({});
     began.ofExperiments = ofExperiments_;
-    report.take(began);
+    report.onEvent(began);
     std::string name = "A";
     for (const Verdict verdict : verdicts) {
-      takeAll(report, eventsOf(quietRecord(name, verdict)));
+      report.addRecord(quietRecord(name, verdict));
       ++name[0];
     }
   }
 
   static ExitCode end(RunReport& report, const std::optional<std::string>& interrupted = std::nullopt) {
-    report.take(RunEnded{interrupted, momentAt(99)});
+    report.onEvent(RunEnded{interrupted, momentAt(99)});
     return report.exitCode();
   }
 
@@ -197,7 +175,7 @@ TEST_F(RunReportTest, PointsOutUnfiredFaults) {
   RunReport report({}, console_);
   DiagnosticRecord record = quietRecord("A", Verdict::kPass);
   record.faults[0].fired = 0;
-  takeAll(report, eventsOf(record));
+  report.addRecord(record);
   EXPECT_THAT(err_.str(), HasSubstr("A: a fault of the simulated phone never fired"));
 }
 
@@ -257,10 +235,10 @@ TEST_F(RunReportTest, ShowsLogLinesUpToTheirLevelByTheWallClock) {
   ReportOptions options;
   options.shownLog = LogLevel::kDefault;
   RunReport report(options, console_);
-  report.take(beginningOf("A"));
-  report.take(Logged{{{}, LogLevel::kError, "an error", momentAt(250)}});
-  report.take(Logged{{{}, LogLevel::kDefault, "two\nlines", momentAt(1000)}});
-  report.take(Logged{{{}, LogLevel::kDebug, "a detail", momentAt(1001)}});
+  report.onEvent(beginningOf("A"));
+  report.onEvent(Logged{{{}, LogLevel::kError, "an error", momentAt(250)}});
+  report.onEvent(Logged{{{}, LogLevel::kDefault, "two\nlines", momentAt(1000)}});
+  report.onEvent(Logged{{{}, LogLevel::kDebug, "a detail", momentAt(1001)}});
   const std::string category(sharedLog().category());
   EXPECT_EQ(err_.str(), "2026-11-21 01:08:00.250 error " + category + ": an error\n" +
                             "2026-11-21 01:08:01.000 default " + category + ": two\n    lines\n");
@@ -268,20 +246,21 @@ TEST_F(RunReportTest, ShowsLogLinesUpToTheirLevelByTheWallClock) {
 
 TEST_F(RunReportTest, ShowsLogLinesThatCannotSteerTheTerminal) {
   RunReport report({}, console_);
-  report.take(beginningOf("A"));
-  report.take(Logged{{{}, LogLevel::kError, "a\033[2Jb\r\xFF\xC2\x9B\tc\nd\a\n", momentAt(250)}});
+  report.onEvent(beginningOf("A"));
+  report.onEvent(Logged{{{}, LogLevel::kError, "a\033[2Jb\r\xFF\xC2\x9B\tc\nd\a\n", momentAt(250)}});
   const std::string category(sharedLog().category());
   EXPECT_EQ(err_.str(), "2026-11-21 01:08:00.250 error " + category + ": a\\x1b[2Jb\\x0d\\xff\\x9b\tc\n    d\\x07\n");
 }
 
 TEST_F(RunReportTest, ShowsNothingThatIsNotUtf8OnTheStandardOutput) {
   RunReport report({}, console_);
-  report.take(runOf({}));
+  report.onEvent(runOf({}));
   DiagnosticRecord record = quietRecord("N\xFF", Verdict::kError);
   record.measuredResults.clear();
-  record.measuredResults.push_back({QZMeasuredResult("r\xC3", Measurement(1, QZDimensionlessUnit::frames())), {}});
+  record.measuredResults.push_back(
+      judgeResult(QZMeasuredResult("r\xC3", Measurement(1, QZDimensionlessUnit::frames()))));
   record.error = makeError("D", 1, "it\x80 broke");
-  takeAll(report, eventsOf(record));
+  report.addRecord(record);
   end(report);
   EXPECT_THAT(out_.str(), HasSubstr("N\\xff\n"));
   EXPECT_THAT(out_.str(), HasSubstr("  r\\xc3 "));
@@ -292,12 +271,12 @@ TEST_F(RunReportTest, ShowsTheProgressOfWhatIsRunning) {
   console_.showsProgress = true;
   RunReport report({}, console_);
   EXPECT_TRUE(report.progress().isShown());
-  report.take(beginningOf("Slow"));
+  report.onEvent(beginningOf("Slow"));
   while (err_.str().empty()) report.progress().update();
   EXPECT_EQ(err_.str(), "Running Slow: 0.3 s of 3 s");
-  report.take(Logged{{{}, LogLevel::kError, "a line", momentAt(250)}});
+  report.onEvent(Logged{{{}, LogLevel::kError, "a line", momentAt(250)}});
   EXPECT_THAT(err_.str(), testing::StartsWith("Running Slow: 0.3 s of 3 s\r\033[K2026-11-21"));
-  report.take(DiagnosticEnded{Verdict::kPass, momentAt(9)});
+  report.addRecord(quietRecord("Slow", Verdict::kPass));
   EXPECT_THAT(err_.str(), EndsWith("a line\n"));
 }
 

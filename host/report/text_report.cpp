@@ -52,7 +52,7 @@ void printResults(std::ostream& out, const std::vector<JudgedResult>& results, b
   using Align = Table::Align;
   Table table({Align::kLeft, Align::kRight, Align::kLeft, Align::kLeft, Align::kLeft});
   table.addRow({"Result", "Value", "Unit", "Limit", "Verdict"});
-  for (const auto& [result, verdict] : results) {
+  for (const auto& [result, verdict, ignored] : results) {
     const Measurement& measurement = result.measurement();
     std::string_view before;
     if (verdict == ResultVerdict::kPass) before = kGreen;

@@ -88,8 +88,7 @@ TEST(PrintRecord, UsesColourOnlyWhenAsked) {
 TEST(PrintRecord, KeepsTerminalSequencesOfAPluginFromTheTerminal) {
   DiagnosticRecord record = recordOf("Na\033[2Jme", Verdict::kPass);
   record.summary = "Sum\033mary";
-  record.measuredResults = {
-      {QZMeasuredResult("R\033", Measurement(1, QZUnit::unitWithSymbol("u\033"))), ResultVerdict::kNone}};
+  record.measuredResults = {judgeResult(QZMeasuredResult("R\033", Measurement(1, QZUnit::unitWithSymbol("u\033"))))};
   EXPECT_THAT(printed(record), Not(HasSubstr("\033")));
 }
 

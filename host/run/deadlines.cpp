@@ -28,7 +28,7 @@ DeadlineSetting parseDeadline(const std::string& text) {
     setting.stage = stageNamed(name);
     if (!setting.stage) {
       throw CommandError(ExitCode::kUsage, what + "unknown stage '" + name +
-                                               "'; the stages are load, describe, setup, run, teardown and analyse");
+                                               "'; the stages are load, describe, setup, run, teardown and analyze");
     }
     seconds = text.substr(equals + 1);
   }

@@ -30,10 +30,18 @@ TEST(ParseDeadline, TakesSecondsOfOneStageOrOfAll) {
     std::chrono::nanoseconds time;
   };
   const Row rows[] = {
-      {"5", std::nullopt, 5s},        {"0.25", std::nullopt, 250ms},        {"1e-9", std::nullopt, 1ns},
-      {"load=1", Stage::kLoad, 1s},   {"describe=1", Stage::kDescribe, 1s}, {"setup=1", Stage::kSetup, 1s},
-      {"run=90", Stage::kRun, 90s},   {"teardown=1", Stage::kTeardown, 1s}, {"analyse=1", Stage::kAnalyse, 1s},
-      {"1e300", std::nullopt, kYear}, {"run=31536001", Stage::kRun, kYear},
+      {"5", std::nullopt, 5s},
+      {"0.25", std::nullopt, 250ms},
+      {"1e-9", std::nullopt, 1ns},
+      {"load=1", Stage::kLoad, 1s},
+      {"describe=1", Stage::kDescribe, 1s},
+      {"setup=1", Stage::kSetup, 1s},
+      {"run=90", Stage::kRun, 90s},
+      {"teardown=1", Stage::kTeardown, 1s},
+      {"analyze=1", Stage::kAnalyze, 1s},
+      {"analyse=1", Stage::kAnalyze, 1s},
+      {"1e300", std::nullopt, kYear},
+      {"run=31536001", Stage::kRun, kYear},
   };
   for (const Row& row : rows) {
     const DeadlineSetting setting = parseDeadline(row.text);
@@ -60,7 +68,7 @@ TEST(ParseDeadline, RefusesOtherTexts) {
       {"run=-0.0", "the time must be greater than zero"},
       {"1e-30", "the time must be greater than zero"},
       {"=5", "unknown stage ''"},
-      {"runn=5", "unknown stage 'runn'; the stages are load, describe, setup, run, teardown and analyse"},
+      {"runn=5", "unknown stage 'runn'; the stages are load, describe, setup, run, teardown and analyze"},
       {"Run=5", "unknown stage 'Run'"},
       {"run=5=6", "'5=6' is not a number"},
   };
@@ -100,10 +108,10 @@ TEST(Deadlines, TakeWhatIsSetOfOneStageForMoreThanWhatIsSetOfAll) {
                                std::vector{parseDeadline("5"), parseDeadline("run=7")}}) {
     const Deadlines both(parameters, settings);
     EXPECT_EQ(both.of(Stage::kRun), 7s);
-    EXPECT_EQ(both.of(Stage::kAnalyse), 5s);
+    EXPECT_EQ(both.of(Stage::kAnalyze), 5s);
   }
-  const Deadlines one(parameters, {parseDeadline("analyse=1"), parseDeadline("analyse=2")});
-  EXPECT_EQ(one.of(Stage::kAnalyse), 2s);
+  const Deadlines one(parameters, {parseDeadline("analyze=1"), parseDeadline("analyze=2")});
+  EXPECT_EQ(one.of(Stage::kAnalyze), 2s);
   EXPECT_EQ(one.of(Stage::kRun), 66s);
 }
 

@@ -27,9 +27,9 @@ class OneAtATime final : public RunEventSink {
  public:
   explicit OneAtATime(RunEventSink& events) : events_(events) {}
 
-  void take(const RunEvent& event) override {
+  void onEvent(const RunEvent& event) override {
     const std::lock_guard lock(mutex_);
-    events_.take(event);
+    events_.onEvent(event);
   }
 
  private:
@@ -100,20 +100,21 @@ class Run {
     for (const auto& one : result.measurements()) {
       chunk.measurements.push_back(one);
       if (chunk.measurements.size() < kChunk) continue;
-      events_.take(std::exchange(chunk, MeasurementsAdded()));
+      events_.onEvent(std::exchange(chunk, MeasurementsAdded()));
     }
-    if (!chunk.measurements.empty()) events_.take(chunk);
-    for (const auto& [key, value] : result.auxiliaryData()) events_.take(AuxiliaryDataAdded{key, value});
+    if (!chunk.measurements.empty()) events_.onEvent(chunk);
+    for (const auto& [key, value] : result.auxiliaryData()) events_.onEvent(AuxiliaryDataAdded{key, value});
   }
 
-  void analyse(const QZExperimentResult& measured) {
+  void analyze(const QZExperimentResult& measured) {
     std::unique_ptr<QZAnalysisResult> result;
-    inStage(Stage::kAnalyse, [&] { result = analysis(measured); });
+    inStage(Stage::kAnalyze, [&] { result = analysis(measured); });
     if (result == nullptr) return;
     const std::vector<QZMeasuredResult>& results = result->measuredResults();
     for (std::size_t i = 0; i < results.size(); i += kChunk) {
       const auto begin = results.begin() + static_cast<std::ptrdiff_t>(i);
-      events_.take(ResultsReported{{begin, begin + static_cast<std::ptrdiff_t>(std::min(kChunk, results.size() - i))}});
+      events_.onEvent(
+          ResultsReported{{begin, begin + static_cast<std::ptrdiff_t>(std::min(kChunk, results.size() - i))}});
     }
   }
 
@@ -121,11 +122,11 @@ class Run {
   template <class Work>
   void inStage(Stage stage, Work&& work) {
     stage_ = stage;
-    events_.take(StageStarted{stage, dateNow()});
+    events_.onEvent(StageStarted{stage, dateNow()});
     const std::chrono::nanoseconds begin = clock_.now();
     std::forward<Work>(work)();
     const std::chrono::nanoseconds duration = clock_.now() - begin;
-    events_.take(StageEnded{stage, duration, dateNow()});
+    events_.onEvent(StageEnded{stage, duration, dateNow()});
   }
 
   // Calls into the plug-in.
@@ -133,7 +134,7 @@ class Run {
   bool attempt(const std::string& operation, Call&& call) {
     DiagnosticErrorPtr failure;
     if (callPlugin(operation, &failure, std::forward<Call>(call))) return true;
-    events_.take(Failed{stage_, std::move(failure)});
+    events_.onEvent(Failed{stage_, std::move(failure)});
     return false;
   }
 
@@ -199,14 +200,14 @@ void runDiagnostic(const Diagnostic& diagnostic, const ResolvedParameters& param
     installPlatform(platform);
     Run run(diagnostic, parameters, *platform.clock, serial);
     const std::unique_ptr<QZExperimentResult> result = run.experiment();
-    if (result != nullptr && !diagnostic.experimentOnly) run.analyse(*result);
+    if (result != nullptr && !diagnostic.experimentOnly) run.analyze(*result);
     installPlatform(nullPlatform());
   }
-  events.take(FaultsCounted{phone->faults()});
-  events.take(DiagnosticCompleted{});
+  events.onEvent(FaultsCounted{phone->faults()});
+  events.onEvent(DiagnosticCompleted{});
 }
 
-void analyseResult(const Diagnostic& diagnostic, const ResolvedParameters& parameters, const QZExperimentResult& result,
+void analyzeResult(const Diagnostic& diagnostic, const ResolvedParameters& parameters, const QZExperimentResult& result,
                    LogLevel logLevel, RunEventSink& events) {
   OneAtATime serial(events);
   const Platform platform = nullPlatform();
@@ -214,10 +215,10 @@ void analyseResult(const Diagnostic& diagnostic, const ResolvedParameters& param
     const LogOfRun log(platform.clock, logLevel, serial);
     installPlatform(platform);
     Run run(diagnostic, parameters, *platform.clock, serial);
-    run.tell(result);  // so that what the analysis makes of it can be analysed again
-    run.analyse(result);
+    run.tell(result);  // so that what the analysis makes of it can be analyzed again
+    run.analyze(result);
   }
-  events.take(DiagnosticCompleted{});
+  events.onEvent(DiagnosticCompleted{});
 }
 
 }  // namespace quazor

@@ -31,7 +31,7 @@ void runDiagnostic(const Diagnostic& diagnostic, const ResolvedParameters& param
 
 // As runDiagnostic, from the analysis on: `result` is what an earlier run measured, and is told first. There is no
 // phone.
-void analyseResult(const Diagnostic& diagnostic, const ResolvedParameters& parameters, const QZExperimentResult& result,
+void analyzeResult(const Diagnostic& diagnostic, const ResolvedParameters& parameters, const QZExperimentResult& result,
                    LogLevel logLevel, RunEventSink& events);
 
 }  // namespace quazor

@@ -43,7 +43,7 @@ class DiagnosticRunTest : public testing::Test {
     events_.events.clear();
     DiagnosticStarted began = beginningOf("Fake");
     began.experimentOnly = diagnostic_.diagnostic.experimentOnly;
-    events_.take(began);
+    events_.onEvent(began);
     runDiagnostic(diagnostic_.diagnostic, parameters, options_, events_);
     return recordOfEvents();
   }
@@ -58,9 +58,9 @@ class DiagnosticRunTest : public testing::Test {
   // What the events come to when the host closes them.
   DiagnosticRecord recordOfEvents() const {
     RecordBuilder builder;
-    for (const RunEvent& event : events_.events) builder.take(event);
+    for (const RunEvent& event : events_.events) builder.onEvent(event);
     EXPECT_TRUE(builder.isCompleted());
-    for (const RunEvent& event : builder.ending(momentAt(99))) builder.take(event);
+    for (const RunEvent& event : builder.ending(momentAt(99))) builder.onEvent(event);
     return builder.takeRecord();
   }
 
@@ -107,7 +107,7 @@ TEST_F(DiagnosticRunTest, TellsEachStageWithItsBeginningAndEnd) {
     }
   }
   EXPECT_EQ(open, std::nullopt);
-  EXPECT_THAT(stages, ElementsAre(Stage::kDescribe, Stage::kSetup, Stage::kRun, Stage::kTeardown, Stage::kAnalyse));
+  EXPECT_THAT(stages, ElementsAre(Stage::kDescribe, Stage::kSetup, Stage::kRun, Stage::kTeardown, Stage::kAnalyze));
 }
 
 TEST_F(DiagnosticRunTest, DatesEverythingByTheWallClock) {
@@ -344,7 +344,7 @@ TEST_F(DiagnosticRunTest, EndsInAnErrorWhenAFactoryFailsOnlyForTheRun) {
   const DiagnosticRecord record = run();
   EXPECT_EQ(record.verdict, Verdict::kError);
   EXPECT_EQ(textOf(record.error), "QuazorHostErrorDomain 3 the factory of FakeAnalysis returned no object");
-  EXPECT_EQ(record.errorStage, Stage::kAnalyse);
+  EXPECT_EQ(record.errorStage, Stage::kAnalyze);
   EXPECT_EQ(record.measurements.size(), 1U);
 }
 
@@ -388,11 +388,11 @@ class LargeDiagnosticTest : public DiagnosticRunTest {
     QZDescription analysisDescription() const override { return QZDescription(""); }
     std::unique_ptr<QZAnalysisResult> analyzeExperimentResult(const QZExperimentResult& result,
                                                               DiagnosticErrorPtr* /*error*/) override {
-      auto analysed = std::make_unique<QZAnalysisResult>();
+      auto analyzed = std::make_unique<QZAnalysisResult>();
       for (const auto& [name, measurement] : result.measurements()) {
-        analysed->measuredResults().emplace_back(name, measurement);
+        analyzed->measuredResults().emplace_back(name, measurement);
       }
-      return analysed;
+      return analyzed;
     }
   };
 
@@ -430,50 +430,50 @@ TEST_F(LargeDiagnosticTest, TellsManyMeasurementsAndResultsInSeveralEvents) {
   }
 }
 
-class AnalyseResultTest : public DiagnosticRunTest {
+class AnalyzeResultTest : public DiagnosticRunTest {
  protected:
-  DiagnosticRecord analyse(const std::vector<std::string>& texts, LogLevel level = LogLevel::kDefault) {
+  DiagnosticRecord analyze(const std::vector<std::string>& texts, LogLevel level = LogLevel::kDefault) {
     QZExperimentResult result;
     result.measurements().set("Count", Measurement(90, QZDimensionlessUnit::frames()));
     result.auxiliaryData().set("bytes", Bytes{1});
     const ResolvedParameters parameters = boundTo(texts);
     events_.events = {beginningOf("Fake")};
-    analyseResult(diagnostic_.diagnostic, parameters, result, level, events_);
+    analyzeResult(diagnostic_.diagnostic, parameters, result, level, events_);
     return recordOfEvents();
   }
 };
 
-TEST_F(AnalyseResultTest, RunsOnlyTheAnalysisOnWhatIsGiven) {
-  const DiagnosticRecord record = analyse({"minimum=90"});
+TEST_F(AnalyzeResultTest, RunsOnlyTheAnalysisOnWhatIsGiven) {
+  const DiagnosticRecord record = analyze({"minimum=90"});
   EXPECT_EQ(record.verdict, Verdict::kPass);
   EXPECT_EQ(phonesMade_, 0);
   EXPECT_EQ(namesOf(events_.events),
             "diagnosticBegan measured collected stageBegan stageEnded found diagnosticCompleted");
   EXPECT_EQ(record.durations.run, std::nullopt);
   EXPECT_EQ(record.durations.analysis, 0ns);
-  EXPECT_EQ(analyse({"minimum=91"}).verdict, Verdict::kFail);
+  EXPECT_EQ(analyze({"minimum=91"}).verdict, Verdict::kFail);
 }
 
-TEST_F(AnalyseResultTest, TellsTheResultSoThatItCanBeAnalysedAgain) {
-  const DiagnosticRecord record = analyse({});
+TEST_F(AnalyzeResultTest, TellsTheResultSoThatItCanBeAnalyzedAgain) {
+  const DiagnosticRecord record = analyze({});
   EXPECT_EQ(*record.measurements.find("Count"), Measurement(90, QZDimensionlessUnit::frames()));
   EXPECT_EQ(*record.auxiliaryData.find("bytes"), Value(Bytes{1}));
 }
 
-TEST_F(AnalyseResultTest, EndsInTheAnalysisError) {
+TEST_F(AnalyzeResultTest, EndsInTheAnalysisError) {
   const DiagnosticRecord record =
-      analyse({"analysis.behaviour=" + std::to_string(static_cast<int>(Behaviour::kAnalyzingFails))});
+      analyze({"analysis.behaviour=" + std::to_string(static_cast<int>(Behaviour::kAnalyzingFails))});
   EXPECT_EQ(textOf(record.error), "FakeDomain 6 analyzing failed");
-  EXPECT_EQ(record.errorStage, Stage::kAnalyse);
+  EXPECT_EQ(record.errorStage, Stage::kAnalyze);
 }
 
-TEST_F(AnalyseResultTest, TellsTheLogLinesOfTheAnalysis) {
+TEST_F(AnalyzeResultTest, TellsTheLogLinesOfTheAnalysis) {
   diagnostic_.diagnostic.makeAnalysis = [] {
     logDebug("making");
     return std::make_shared<fake::FakeAnalysis>();
   };
-  EXPECT_EQ(analyse({}, LogLevel::kDebug).log.size(), 1U);
-  EXPECT_EQ(analyse({}, LogLevel::kDefault).log.size(), 0U);
+  EXPECT_EQ(analyze({}, LogLevel::kDebug).log.size(), 1U);
+  EXPECT_EQ(analyze({}, LogLevel::kDefault).log.size(), 0U);
   EXPECT_FALSE(LogChannel::isEnabled(LogLevel::kError));
 }
 

@@ -38,7 +38,7 @@ EventPipeline::EventPipeline(const EventPipelineOptions& options, Console& conso
   if (options.systemLog) systemLog_ = systemLogOfThisMachine();
 }
 
-void EventPipeline::take(const RunEvent& event) {
+void EventPipeline::onEvent(const RunEvent& event) {
   const std::lock_guard lock(mutex_);
   pass(event);
 }
@@ -47,13 +47,14 @@ void EventPipeline::pass(const RunEvent& event) {
   if (!records_.empty()) {
     // A million log lines are made into text once, not once for each record.
     const std::string line = recordLine(event, recorded_++);
-    for (const std::unique_ptr<RecordWriter>& record : records_) record->take(event, line);
+    for (const std::unique_ptr<RecordWriter>& record : records_) record->onEvent(event, line);
   }
-  builder_.take(event);
+  builder_.onEvent(event);
   if (const auto* const logged = std::get_if<Logged>(&event); logged != nullptr && systemLog_ != nullptr) {
     systemLog_->write(logged->line.level, sharedLog().subsystem(), sharedLog().category(), logged->line.text);
   }
-  report_.take(event);
+  report_.onEvent(event);
+  if (std::holds_alternative<DiagnosticEnded>(event)) report_.addRecord(builder_.takeRecord());
   if (std::holds_alternative<RunEnded>(event)) ended_ = true;
 }
 

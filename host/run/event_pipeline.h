@@ -33,7 +33,7 @@ class EventPipeline final : public RunEventSink {
   // `console` is borrowed.
   EventPipeline(const EventPipelineOptions& options, Console& console);
 
-  void take(const RunEvent& event) override;
+  void onEvent(const RunEvent& event) override;
 
   // Closes the diagnostic that is open, by what is known of it.
   void endDiagnostic();

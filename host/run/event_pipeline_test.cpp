@@ -28,7 +28,7 @@ class EventPipelineTest : public testing::Test {
   EventPipelineTest() { options_.record = record_; }
 
   static void takeAll(EventPipeline& events, const std::vector<RunEvent>& some) {
-    for (const RunEvent& event : some) events.take(event);
+    for (const RunEvent& event : some) events.onEvent(event);
   }
 
   // A diagnostic's events as its process tells them, and its end.
@@ -56,10 +56,10 @@ class EventPipelineTest : public testing::Test {
 
 TEST_F(EventPipelineTest, RecordsAndReportsARun) {
   EventPipeline events(keeping(), console_);
-  events.take(runOf({"A", "B"}));
+  events.onEvent(runOf({"A", "B"}));
   perform(events, "A", 90);
   perform(events, "B", 89);
-  events.take(RunEnded{std::nullopt, momentAt(99)});
+  events.onEvent(RunEnded{std::nullopt, momentAt(99)});
   EXPECT_EQ(events.exitCode(), ExitCode::kFailed);
   EXPECT_THAT(out_.str(),
               AllOf(HasSubstr("  PASS\n"), EndsWith("2 diagnostics: 1 passed, 1 failed, 0 ended in an error\n")));
@@ -91,7 +91,7 @@ TEST_F(EventPipelineTest, RecordsWhatTheUserIsToldBeforehand) {
   std::ostream out(&watcher);
   Console console{out, err_};
   EventPipeline events(options_, console);
-  events.take(runOf({"A"}));
+  events.onEvent(runOf({"A"}));
   perform(events, "A", 90);
   EXPECT_EQ(watcher.isRecorded, true);
 }
@@ -106,13 +106,13 @@ TEST_F(EventPipelineTest, KeepsTheLastRunOnlyWhenItShould) {
 TEST_F(EventPipelineTest, RunsWithoutAPlaceForTheLastRun) {
   directory_.write("state", "a file where a directory should be");
   EventPipeline events(keeping(), console_);
-  events.take(runOf({"A"}));
+  events.onEvent(runOf({"A"}));
   perform(events, "A", 90);
   EXPECT_EQ(runIn(record_).records.size(), 1U);
   const EnvironmentVariable none("XDG_STATE_HOME", nullptr);
   const EnvironmentVariable noHome("HOME", nullptr);
   EventPipeline others(keeping(), console_);
-  others.take(runOf({}));
+  others.onEvent(runOf({}));
 }
 
 TEST_F(EventPipelineTest, RefusesARecordThatCannotBeBegun) {
@@ -129,9 +129,9 @@ TEST_F(EventPipelineTest, RefusesARecordThatCannotBeBegun) {
 TEST_F(EventPipelineTest, EndsADiagnosticInAnErrorWhenItsRecordCannotBeWritten) {
   options_.record = "/dev/full";
   EventPipeline events(keeping(), console_);
-  events.take(runOf({"A"}));
+  events.onEvent(runOf({"A"}));
   perform(events, "A", 90);
-  events.take(RunEnded{std::nullopt, momentAt(99)});
+  events.onEvent(RunEnded{std::nullopt, momentAt(99)});
   EXPECT_EQ(events.exitCode(), ExitCode::kError);
   EXPECT_THAT(out_.str(), HasSubstr("  ERROR\n    QuazorHostErrorDomain code 10: the record '/dev/full' cannot be "
                                     "written: No space left on device\n"));
@@ -140,7 +140,7 @@ TEST_F(EventPipelineTest, EndsADiagnosticInAnErrorWhenItsRecordCannotBeWritten) 
 
 TEST_F(EventPipelineTest, EndsADiagnosticThatWasNotCompletedInAnError) {
   EventPipeline events(options_, console_);
-  events.take(runOf({"A"}));
+  events.onEvent(runOf({"A"}));
   std::vector<RunEvent> some = wholeDiagnostic("A", 90);
   some.pop_back();
   takeAll(events, some);
@@ -150,7 +150,7 @@ TEST_F(EventPipelineTest, EndsADiagnosticThatWasNotCompletedInAnError) {
 
 TEST_F(EventPipelineTest, ClosesTheOpenDiagnosticAndTheRunWhenInterrupted) {
   EventPipeline events(options_, console_);
-  events.take(runOf({"A", "B", "C"}));
+  events.onEvent(runOf({"A", "B", "C"}));
   perform(events, "A", 90);
   takeAll(events, {beginningOf("B"), StageStarted{Stage::kRun, momentAt(2)}});
   bool left = false;
@@ -172,7 +172,7 @@ TEST_F(EventPipelineTest, ClosesTheOpenDiagnosticAndTheRunWhenInterrupted) {
 
 TEST_F(EventPipelineTest, ClosesTheRunWhenInterruptedBetweenTwo) {
   EventPipeline events(options_, console_);
-  events.take(runOf({"A", "B"}));
+  events.onEvent(runOf({"A", "B"}));
   perform(events, "A", 90);
   events.interruptAndLeave([] {});
   EXPECT_EQ(runIn(record_).ended->interrupted, "");
@@ -188,9 +188,9 @@ TEST_F(EventPipelineTest, TakesAnInterruptBetweenTwoStagesForOneOfTheDescription
 
 TEST_F(EventPipelineTest, OnlyLeavesAfterTheEndOfTheRun) {
   EventPipeline events(options_, console_);
-  events.take(runOf({"A"}));
+  events.onEvent(runOf({"A"}));
   perform(events, "A", 90);
-  events.take(RunEnded{std::nullopt, momentAt(99)});
+  events.onEvent(RunEnded{std::nullopt, momentAt(99)});
   const std::string before = directory_.read("record");
   const std::string printed = out_.str();
   bool left = false;
@@ -206,7 +206,7 @@ TEST_F(EventPipelineTest, LetsOneEventThroughAtATime) {
   takeAll(events, {runOf({"A"}), beginningOf("A")});
   constexpr int kLines = 500;
   const auto log = [&events] {
-    for (int i = 0; i < kLines; ++i) events.take(Logged{{{}, LogLevel::kDebug, "a line", momentAt(3)}});
+    for (int i = 0; i < kLines; ++i) events.onEvent(Logged{{{}, LogLevel::kDebug, "a line", momentAt(3)}});
   };
   {
     std::thread one(log);
@@ -222,7 +222,7 @@ TEST_F(EventPipelineTest, SendsLogLinesToTheSystemsLogWhenAskedTo) {
   // It cannot be seen from here what the system makes of them: that nothing else changes is what can.
   options_.systemLog = true;
   EventPipeline events(options_, console_);
-  events.take(runOf({"A"}));
+  events.onEvent(runOf({"A"}));
   perform(events, "A", 90);
   EXPECT_EQ(runIn(record_).records[0].log.size(), 1U);
 }

@@ -63,7 +63,7 @@ class EventsToConnection final : public RunEventSink {
  public:
   explicit EventsToConnection(const Connection& connection) : connection_(connection) {}
 
-  void take(const RunEvent& event) override { connection_.say(eventJson(event)); }
+  void onEvent(const RunEvent& event) override { connection_.say(eventJson(event)); }
 
  private:
   const Connection& connection_;
@@ -271,7 +271,7 @@ class IsolatedRun {
     if (droppedLines_ > 0) log(formatMessage("%@ more lines of output were dropped", droppedLines_));
     if (completed_) return;
     const std::string during = formatMessage("the stage %@ of %@", nameOf(stage_), diagnostic_.name);
-    events_.take(Failed{stage_, errorOf(end, during, deadlines_.of(stage_))});
+    events_.onEvent(Failed{stage_, errorOf(end, during, deadlines_.of(stage_))});
   }
 
  private:
@@ -289,7 +289,7 @@ class IsolatedRun {
     if (std::holds_alternative<StageEnded>(*event)) between_ = true;
     if (between_ && !std::holds_alternative<Logged>(*event)) deadline_ = SteadyClock::now() + deadlines_.of(stage_);
     completed_ = std::holds_alternative<DiagnosticCompleted>(*event);
-    events_.take(*event);
+    events_.onEvent(*event);
     return true;
   }
 
@@ -311,7 +311,7 @@ class IsolatedRun {
     log("output: " + std::string(line));
   }
 
-  void log(std::string text) { events_.take(Logged{{time_, LogLevel::kDefault, std::move(text), dateNow()}}); }
+  void log(std::string text) { events_.onEvent(Logged{{time_, LogLevel::kDefault, std::move(text), dateNow()}}); }
 
   void beginStage(Stage stage) {
     stage_ = stage;
@@ -347,7 +347,7 @@ std::vector<std::filesystem::path> pluginsFor(const Diagnostic& diagnostic,
 std::optional<Diagnostic> loadDiagnostic(const IsolationOptions& options, const Diagnostic& wanted,
                                          RunEventSink& events) {
   std::optional<Diagnostic> found;
-  events.take(StageStarted{Stage::kLoad, dateNow()});
+  events.onEvent(StageStarted{Stage::kLoad, dateNow()});
   std::string problem = "the plug-ins no longer register " + wanted.name;
   try {
     loadSomePlugins(pluginsFor(wanted, options.plugins));
@@ -357,8 +357,8 @@ std::optional<Diagnostic> loadDiagnostic(const IsolationOptions& options, const 
   } catch (const CommandError& refusal) {
     problem = refusal.what();
   }
-  if (!found) events.take(Failed{Stage::kLoad, hostError(HostErrorCode::kNothingMade, problem)});
-  events.take(StageEnded{Stage::kLoad, std::nullopt, dateNow()});
+  if (!found) events.onEvent(Failed{Stage::kLoad, hostError(HostErrorCode::kNothingMade, problem)});
+  events.onEvent(StageEnded{Stage::kLoad, std::nullopt, dateNow()});
   return found;
 }
 
@@ -404,9 +404,9 @@ bool runIsolated(const IsolationOptions& options, WatchedSignals& signals, const
     EventsToConnection toParent(connection);
     const std::optional<Diagnostic> loaded = loadDiagnostic(options, diagnostic, toParent);
     if (!loaded) {
-      toParent.take(DiagnosticCompleted{});
+      toParent.onEvent(DiagnosticCompleted{});
     } else if (result != nullptr) {
-      analyseResult(*loaded, parameters, *result, runOptions.logLevel, toParent);
+      analyzeResult(*loaded, parameters, *result, runOptions.logLevel, toParent);
     } else {
       RunOptions watched = runOptions;
       if (progress.isShown()) {

@@ -55,7 +55,7 @@ PluginScan scanPlugins(const IsolationOptions& options, WatchedSignals& signals,
 // is no DiagnosticCompleted then. What it writes to its standard output and error stream become log lines. False when
 // the user interrupted it.
 //
-// `result`, if it is not null, is analysed, and no experiment is run.
+// `result`, if it is not null, is analyzed, and no experiment is run.
 bool runIsolated(const IsolationOptions& options, WatchedSignals& signals, const Diagnostic& diagnostic,
                  const ResolvedParameters& parameters, const RunOptions& runOptions, const QZExperimentResult* result,
                  Progress& progress, RunEventSink& events);

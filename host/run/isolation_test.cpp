@@ -205,12 +205,12 @@ class RunTest : public IsolationTest {
     const ResolvedParameters parameters = resolveParameters(diagnostic, {}, settings);
     events_.events.clear();
     RecordBuilder builder;
-    builder.take(beginningOf(name));
+    builder.onEvent(beginningOf(name));
     goesOn_ =
         runIsolated(options_, signals_, diagnostic.diagnostic, parameters, runOptions_, result, progress_, events_);
-    for (const RunEvent& event : events_.events) builder.take(event);
+    for (const RunEvent& event : events_.events) builder.onEvent(event);
     isCompleted_ = builder.isCompleted();
-    for (const RunEvent& event : builder.ending(momentAt(99))) builder.take(event);
+    for (const RunEvent& event : builder.ending(momentAt(99))) builder.onEvent(event);
     return builder.takeRecord();
   }
 
@@ -273,13 +273,13 @@ TEST_F(RunTest, LoadsOnlyThePluginsThatTheDiagnosticNeeds) {
     options_.plugins.clear();
     for (const std::string& one : plugins) options_.plugins.push_back(plugin(one));
     RecordBuilder builder;
-    builder.take(beginningOf(name));
+    builder.onEvent(beginningOf(name));
     for (const DescribedDiagnostic& one : all.catalogue) {
       if (one.diagnostic.name != name) continue;
       const ResolvedParameters parameters = resolveParameters(one, {}, {parseOverride("experiment.duration=1")});
       runIsolated(options_, signals_, one.diagnostic, parameters, runOptions_, nullptr, progress_, builder);
     }
-    for (const RunEvent& event : builder.ending(momentAt(99))) builder.take(event);
+    for (const RunEvent& event : builder.ending(momentAt(99))) builder.onEvent(event);
     return textOf(builder.takeRecord().error);
   };
   EXPECT_EQ(runNow("Fake.One", {"fatal", "working", "combining"}), "");

@@ -20,7 +20,7 @@ void append(std::vector<RunEvent>& events, std::vector<RunEvent> more) {
 // The events of the diagnostic that is open, and what closes it.
 std::vector<RunEvent> closed(std::vector<RunEvent> events) {
   RecordBuilder builder;
-  for (const RunEvent& event : events) builder.take(event);
+  for (const RunEvent& event : events) builder.onEvent(event);
   append(events, builder.ending(momentAt(90)));
   return events;
 }
@@ -50,8 +50,8 @@ std::vector<RunEvent> wholeDiagnostic(const std::string& name, double value) {
           StageEnded{Stage::kRun, 3s, momentAt(5)},
           MeasurementsAdded{{{"Raw", Measurement(value, QZDimensionlessUnit::frames())}}},
           AuxiliaryDataAdded{"bytes", Bytes{0xA5}},
-          StageStarted{Stage::kAnalyse, momentAt(6)},
-          StageEnded{Stage::kAnalyse, std::nullopt, momentAt(7)},
+          StageStarted{Stage::kAnalyze, momentAt(6)},
+          StageEnded{Stage::kAnalyze, std::nullopt, momentAt(7)},
           ResultsReported{{resultOf(value)}},
           FaultsCounted{{{{{"operation", "CaptureStream.start"}}, 1}}},
           DiagnosticCompleted{}};

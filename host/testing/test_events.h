@@ -12,7 +12,7 @@ namespace quazor {
 // Keeps what it takes.
 class EventList final : public RunEventSink {
  public:
-  void take(const RunEvent& event) override { events.push_back(event); }
+  void onEvent(const RunEvent& event) override { events.push_back(event); }
 
   std::vector<RunEvent> events;
 };

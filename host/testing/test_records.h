@@ -7,6 +7,7 @@
 #include <memory>
 #include <string>
 #include <utility>
+#include <vector>
 
 namespace quazor {
 
@@ -16,6 +17,12 @@ inline QZMeasuredResult resultWithMinimum(double value, double minimum) {
   limit.setLowerBound(std::make_shared<const QZBound>(Measurement(minimum, QZDimensionlessUnit::frames()), false));
   result.setLimit(std::move(limit));
   return result;
+}
+
+inline std::vector<JudgedResult> judgeResults(const std::vector<QZMeasuredResult>& results) {
+  std::vector<JudgedResult> judged;
+  for (const QZMeasuredResult& result : results) judged.push_back(judgeResult(result));
+  return judged;
 }
 
 // A record with one limited result, one for information, and something of everything else.
@@ -28,10 +35,8 @@ inline DiagnosticRecord recordOf(const std::string& name, Verdict verdict) {
   record.parameters.experiment.push_back({"duration", QZNumberParameter("", true), Value(3), "command line"});
   record.parameters.experiment.push_back({"gain", QZNumberParameter("", false), std::nullopt, ""});
   const double value = verdict == Verdict::kFail ? 89 : 90;
-  const ResultVerdict judged = verdict == Verdict::kFail ? ResultVerdict::kFail : ResultVerdict::kPass;
-  record.measuredResults.push_back({resultWithMinimum(value, 90), judged});
-  record.measuredResults.push_back(
-      {QZMeasuredResult("Offset", Measurement(0.5, QZDimensionlessUnit::events())), ResultVerdict::kNone});
+  record.measuredResults = judgeResults(
+      {resultWithMinimum(value, 90), QZMeasuredResult("Offset", Measurement(0.5, QZDimensionlessUnit::events()))});
   record.measurements.set("Raw", Measurement(value, QZDimensionlessUnit::frames()));
   record.auxiliaryData.set("bytes", Bytes{0xA5});
   record.log.push_back({250ms, LogLevel::kError, "a line"});

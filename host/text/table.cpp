@@ -28,8 +28,8 @@ void appendEscaped(std::string& shown, std::string_view bytes) {
   for (; !bytes.empty(); bytes.remove_prefix(1)) shown += "\\x" + hexadecimal(bytes.substr(0, 1));
 }
 
-// With what steers a terminal, and what is no text at all, shown as \xNN; but for the characters of `kept`.
-std::string shownText(std::string_view text, std::string_view kept) {
+// With what steers a terminal, and what is no text at all, shown as \xNN; but for the characters of `allowed`.
+std::string shownText(std::string_view text, std::string_view allowed) {
   std::string shown;
   shown.reserve(text.size());
   while (!text.empty()) {
@@ -39,7 +39,7 @@ std::string shownText(std::string_view text, std::string_view kept) {
     if (isWideControl(character)) {
       appendEscaped(shown, character.substr(1));  // the code point's number is that of its second byte
     } else if (!sequence.wellFormed || (isControl(static_cast<unsigned char>(character.front())) &&
-                                        kept.find(character.front()) == std::string_view::npos)) {
+                                        allowed.find(character.front()) == std::string_view::npos)) {
       appendEscaped(shown, character);
     } else {
       shown += character;

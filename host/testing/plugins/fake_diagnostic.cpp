@@ -97,16 +97,16 @@ std::unique_ptr<QZAnalysisResult> FakeAnalysis::analyzeExperimentResult(const QZ
     failWith(error, 6, "analyzing failed");
     return nullptr;
   }
-  auto analysed = std::make_unique<QZAnalysisResult>();
-  if (behaviour_ == Behaviour::kNothingMeasured) return analysed;
+  auto analyzed = std::make_unique<QZAnalysisResult>();
+  if (behaviour_ == Behaviour::kNothingMeasured) return analyzed;
   const bool wrongUnit = behaviour_ == Behaviour::kBoundInAnotherUnit;
   const QZUnit& unit = wrongUnit ? QZDimensionlessUnit::errors() : QZDimensionlessUnit::frames();
   const Measurement& count = *result.measurements().find("Count");
   QZLimit limit("Enough");
   limit.setLowerBound(std::make_shared<const QZBound>(Measurement(minimum_, unit), false));
-  analysed->measuredResults().emplace_back("Count", count).setLimit(std::move(limit));
-  analysed->measuredResults().emplace_back("Echo", count);
-  return analysed;
+  analyzed->measuredResults().emplace_back("Count", count).setLimit(std::move(limit));
+  analyzed->measuredResults().emplace_back("Echo", count);
+  return analyzed;
 }
 
 }  // namespace quazor::fake

@@ -1,10 +1,11 @@
-#include "host/model/verdict_of_record.h"
+#include "host/model/judge.h"
 
 #include "host/error/host_error.h"
 #include "host/model/record_builder.h"
 #include "host/record/verification.h"
 #include "host/testing/test_events.h"
 #include "host/testing/test_oracle.h"
+#include "host/testing/test_records.h"
 #include "host/testing/test_values.h"
 
 #include <gtest/gtest.h>
@@ -19,7 +20,7 @@ DiagnosticErrorPtr someError() { return errorWithMessage("D", 1, "m", nullptr); 
 
 DiagnosticRecord recordWith(const std::vector<QZMeasuredResult>& results, const DiagnosticErrorPtr& error) {
   DiagnosticRecord record;
-  for (const QZMeasuredResult& result : results) record.measuredResults.push_back({result, ResultVerdict::kPass});
+  record.measuredResults = judgeResults(results);
   record.error = error;
   return record;
 }
@@ -136,7 +137,7 @@ TEST(JudgeRecord, AgreesWithTheOracleOnWhateverAPluginTells) {
     Told told;
     std::vector<RunEvent> events = random.sequence(&told);
     RecordBuilder builder;
-    for (const RunEvent& event : events) builder.take(event);
+    for (const RunEvent& event : events) builder.onEvent(event);
     for (RunEvent& event : builder.ending(momentAt(9))) events.push_back(std::move(event));
     Verdict& verdict = std::get<DiagnosticEnded>(events.back()).verdict;
     ASSERT_EQ(verdict, oracleVerdict(told.results, told.hasError, told.completed)) << i;
