@@ -6,6 +6,7 @@
 
 namespace QUAZOR_CONTRACT {
 
+// cppcheck-suppress uninitMemberVar  // all are, below
 DiagnosticError::DiagnosticError(std::string_view domain, std::int64_t code, Dictionary userInfo)
     : domain_(domain), code_(code), userInfo_(std::move(userInfo)) {}
 

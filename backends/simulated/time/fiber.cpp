@@ -25,8 +25,8 @@
 namespace quazor {
 namespace {
 
-constexpr std::size_t kGuardSize = 64 * 1024;  // a multiple of every page size in use
-constexpr std::size_t kStackSize = 512 * 1024;
+constexpr std::size_t kGuardSize = std::size_t{64} * 1024;  // a multiple of every page size in use
+constexpr std::size_t kStackSize = std::size_t{512} * 1024;
 
 thread_local Fiber* entering = nullptr;  // makecontext hands integers only to the entry function
 
