@@ -7,8 +7,10 @@
     a CMakeLists.txt, unless BUILT_ABOVE lists it.
   - A folder that holds C++, and each of DESCRIBED, has a README.md: a title, an empty line, and the five lines of
     LINES in that order. A document may follow after an empty line.
-  - Where the line "What it may include" names a folder, `folder/`, that is one of the folder's row, one above those, or
-    the folder itself.
+  - The line "What it may include" agrees with the folder's row: what it names, `folder/`, is of the row, above such a
+    folder, or the folder itself; and each folder of the row is named, or one above it is.
+  - What the five lines name in `back quotes` is there: a file (`name.h`), somewhere in the tree, and a class or a function
+    (`ClassName`, `name()`), in some source.
   - A folder holds at most MAX_FILES source files (*.h and *.cpp; tests beside the code do not count), and a source file
     has at most MAX_LINES lines (Python programs of the tree too).
 
@@ -30,9 +32,13 @@ DESCRIBED = ["backends", "base", "benchmarks", "cmake", "data", "data/bindings",
              "data/scenarios", "diagnostics", "docs", "examples", "host", "packaging", "tests", "tests/tree"]
 # Folders whose sources a CMakeLists.txt above them names.
 BUILT_ABOVE = ["tests/compile_failures", "tests/misbehaving"]
+# Folders that may include nearly all; nobody wants to read which.
+NOT_LISTED = ["tests", "benchmarks"]
 # Examples have a README of their own: they are documents for people who see nothing else of the tree.
 SELF_DESCRIBED = "examples/"
 
+NAMED_FILE = re.compile(r"`([\w./-]+\.(?:h|cpp|py|json|cmake|sh|md))`")
+NAMED_CODE = re.compile(r"`(?:\w+::)*([A-Z]\w*[a-z]\w*|\w+(?=\(\)))(?:\(\))?`")
 NAMED_FOLDER = re.compile(r"`([\w/]+)/`")
 
 
@@ -49,6 +55,20 @@ def folders_with_sources(root):
     return folders
 
 
+def names_of_tree(root, folders):
+    """The names of all files, and all words of the C++ sources."""
+    files = {path.name for path in root.rglob("*") if is_ours(path, root)}
+    words = set()
+    for paths in folders.values():
+        for path in paths:
+            words.update(re.findall(r"\w+", (root / path).read_text(encoding="utf-8")))
+    return files, words
+
+
+def is_below(folder, above):
+    return folder == above or folder.startswith(above + "/")
+
+
 def row_of(folder, rows):
     """What a folder's README may name: of a folder without a row, what the folders below it may include."""
     for above in ("tests", "benchmarks", "examples"):
@@ -60,7 +80,7 @@ def row_of(folder, rows):
     return [folder, *below, *(included for name in below for included in rows[name])]
 
 
-def check_readme(root, folder, rows):
+def check_readme(root, folder, rows, files, words):
     """What is wrong with a folder's README, as a list of sentences."""
     readme = root / folder / "README.md"
     if not readme.is_file():
@@ -75,10 +95,16 @@ def check_readme(root, folder, rows):
             return [f'{name}:{number + 3}: this line must be "**{heading}**: ..."']
     if len(lines) > 2 + len(LINES) and lines[2 + len(LINES)]:
         return [f"{name}:{3 + len(LINES)}: an empty line must follow the five lines"]
-    allowed = row_of(folder, rows)
-    return [f"{name}: {folder}/ must not include {named}/, which it names"
-            for named in NAMED_FOLDER.findall(described[LINES.index("What it may include")])
-            if not any(one == named or one.startswith(named + "/") for one in allowed)]
+    text = "\n".join(described)
+    missing = [one for one in NAMED_FILE.findall(text) if pathlib.PurePosixPath(one).name not in files]
+    missing += [one for one in NAMED_CODE.findall(text) if one not in words]
+    named = NAMED_FOLDER.findall(described[LINES.index("What it may include")])
+    allowed, wanted = row_of(folder, rows), rows.get(folder, []) if folder not in NOT_LISTED else []
+    return [*(f"{name}: there is no {one}, which it names" for one in missing),
+            *(f"{name}: {folder}/ must not include {one}/, which it names" for one in named
+              if not any(is_below(other, one) for other in allowed)),
+            *(f"{name}: {folder}/ may include {one}/, which it does not name" for one in wanted
+              if not any(is_below(one, above) for above in named))]
 
 
 def check_sizes(root, folders):
@@ -103,9 +129,10 @@ def violations(root, rows, described):
             found.append(f"{folder}/ has no row in tests/tree/include_directions.py")
         if folder not in BUILT_ABOVE and not (root / folder / "CMakeLists.txt").is_file():
             found.append(f"{folder}/ has no CMakeLists.txt")
+    files, words = names_of_tree(root, folders)
     for folder in sorted({*folders, *described}):
         if not folder.startswith(SELF_DESCRIBED):
-            found += check_readme(root, folder, rows)
+            found += check_readme(root, folder, rows, files, words)
     return found + check_sizes(root, folders)
 
 

@@ -6,7 +6,6 @@ import tempfile
 import unittest
 
 import folders
-import include_directions
 
 ROWS = {"contract": [], "base/text": [], "base/json": ["contract", "base/text"], "host/run": ["contract", "base/json"]}
 README = """# contract: a title
@@ -84,13 +83,29 @@ class FoldersTest(unittest.TestCase):
                          ["contract/README.md:8: an empty line must follow the five lines"])
 
     def test_a_readme_names_only_folders_of_its_row(self):
-        for text in ("`contract/`, `base/text/`.", "`base/json/`.", "`base/`.", "`a.h` and `b`."):
+        for text in ("`contract/`, `base/text/`.", "`contract/`, `base/`.", "`contract/`, `base/`, `base/json/`."):
             with self.subTest(text=text):
                 self.assertEqual(found_in(may_include(text)), [])
-        for text, named in (("`contract/` and `platform/`.", "platform"), ("`host/`.", "host"), ("`base/te/`.", "base/te")):
+        for named in ("platform", "host", "base/te"):
+            with self.subTest(named=named):
+                self.assertEqual(found_in(may_include(f"`contract/`, `base/text/`, `{named}/`.")),
+                                 [f"base/json/README.md: base/json/ must not include {named}/, which it names"])
+
+    def test_a_readme_names_every_folder_of_its_row(self):
+        for text, missing in (("`contract/`.", ["base/text"]), ("`contract` and `base/text`.", ["contract", "base/text"]),
+                              ("`base/`.", ["contract"])):
             with self.subTest(text=text):
                 self.assertEqual(found_in(may_include(text)),
-                                 [f"base/json/README.md: base/json/ must not include {named}/, which it names"])
+                                 [f"base/json/README.md: base/json/ may include {one}/, which it does not name" for one in missing])
+
+    def test_what_a_readme_names_is_there(self):
+        source = {"contract/value.h": "class Value { int kind_; void print(); };"}
+        for text, missing in (("`Value` in `value.h`", []), ("`contract/value.h`", []), ("`print()` of `Value::print()`", []),
+                              ("`Lamp` in `lamp.h`", ["lamp.h", "Lamp"]), ("`light()`", ["light"]), ("`Lamp::print()`", []),
+                              ("`*_test.py`, `./run`, `quazor`", [])):
+            with self.subTest(text=text):
+                found = found_in({**source, "contract/README.md": README.replace("values.", text + ".")})
+                self.assertEqual(found, [f"contract/README.md: there is no {one}, which it names" for one in missing])
 
     def test_a_folder_above_may_name_what_its_folders_may(self):
         readme = {"base/README.md": README.replace("the standard library only.", "`contract/`, `base/text/`.")}
@@ -114,7 +129,7 @@ class OwnTreeTest(unittest.TestCase):
     ROOT = pathlib.Path(__file__).resolve().parents[2]
 
     def test_every_listed_folder_is_there(self):
-        for folder in [*folders.DESCRIBED, *folders.BUILT_ABOVE, *include_directions.ALLOWED]:
+        for folder in [*folders.DESCRIBED, *folders.BUILT_ABOVE]:
             with self.subTest(folder=folder):
                 self.assertTrue((self.ROOT / folder).is_dir())
 
