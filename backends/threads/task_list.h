@@ -136,6 +136,7 @@ class TaskList {
     std::size_t unneeded_ = 0;  // the lowest count since freeUnneeded
   };
 
+  // NOLINTNEXTLINE(performance-no-int-to-ptr): a tail is a segment's address and, in its lower bits, a count
   static Segment* segmentOf(std::uintptr_t tail) { return reinterpret_cast<Segment*>(tail & ~(kSegmentAlignment - 1)); }
   // Claims a slot; returns the tail as it was before.
   std::uintptr_t claim();
