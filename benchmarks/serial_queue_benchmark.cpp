@@ -6,7 +6,9 @@
 #include <algorithm>
 #include <chrono>
 #include <cstddef>
+#include <functional>
 #include <memory>
+#include <random>
 #include <semaphore>
 #include <string>
 #include <thread>
@@ -47,54 +49,76 @@ double quantile(const std::vector<double>& sorted, double fraction) {
   return sorted[static_cast<std::size_t>(fraction * static_cast<double>(sorted.size() - 1))];
 }
 
-// From before the post to the first instruction of the task, after two milliseconds without work.
+using SteadyClock = std::chrono::steady_clock;
+
+// From before the post to the first instruction of the task, after two milliseconds without work; in nanoseconds.
 template <class Queue>
+double nanosecondsToWake(Queue& queue) {
+  std::this_thread::sleep_for(std::chrono::milliseconds(2));
+  std::binary_semaphore done(0);
+  SteadyClock::time_point started;
+  const SteadyClock::time_point posted = SteadyClock::now();
+  queue.post([&started, &done] {
+    started = SteadyClock::now();
+    done.release();
+  });
+  done.acquire();
+  return std::chrono::duration<double, std::nano>(started - posted).count();
+}
+
+// A queue under measurement and what was measured.
+struct WakeUps {
+  std::string name;
+  std::function<double()> measure;
+  std::vector<double> samples;
+};
+
+template <class Queue>
+WakeUps wakeUpsOf(const std::string& name) {
+  return {name, [queue = std::make_shared<Queue>()] { return nanosecondsToWake(*queue); }, {}};
+}
+
+// The queues take turns, in another order each time, so that what else the machine does meets all of them alike.
 void wakeUp(benchmark::State& state) {
-  using Clock = std::chrono::steady_clock;
-  Queue queue;
-  std::vector<double> samples;  // in nanoseconds
+  std::vector<WakeUps> queues = {wakeUpsOf<QuazorQueue>("quazor"),
+                                 wakeUpsOf<AsioStrand>("asio strand"),
+                                 wakeUpsOf<AsioPool>("asio pool"),
+                                 wakeUpsOf<TbbNode>("tbb node"),
+                                 wakeUpsOf<MoodycamelBulk>("moodycamel bulk"),
+                                 wakeUpsOf<MutexQueue>("mutex queue")};
+  std::minstd_rand random(1);
   for (auto _ : state) {
-    std::this_thread::sleep_for(std::chrono::milliseconds(2));
-    std::binary_semaphore done(0);
-    Clock::time_point started;
-    const Clock::time_point posted = Clock::now();
-    queue.post([&started, &done] {
-      started = Clock::now();
-      done.release();
-    });
-    done.acquire();
-    const std::chrono::duration<double> taken = started - posted;
-    state.SetIterationTime(taken.count());
-    samples.push_back(taken.count() * 1e9);
+    std::shuffle(queues.begin(), queues.end(), random);
+    for (WakeUps& queue : queues) queue.samples.push_back(queue.measure());
   }
-  std::sort(samples.begin(), samples.end());
-  state.counters["median_ns"] = quantile(samples, 0.5);
-  state.counters["p99_ns"] = quantile(samples, 0.99);
+  for (WakeUps& queue : queues) {
+    std::sort(queue.samples.begin(), queue.samples.end());
+    state.counters[queue.name + " median_ns"] = quantile(queue.samples, 0.5);
+    state.counters[queue.name + " p99_ns"] = quantile(queue.samples, 0.99);
+  }
 }
 
 template <class Queue>
-void registerQueue(const std::string& name) {
+void registerThroughput(const std::string& name) {
   benchmark::RegisterBenchmark(("throughput/" + name).c_str(), throughput<Queue>)
       ->Threads(1)
       ->Threads(2)
       ->UseRealTime()
       ->Unit(benchmark::kMillisecond);
-  benchmark::RegisterBenchmark(("wake_up/" + name).c_str(), wakeUp<Queue>)
-      ->Iterations(100)
-      ->UseManualTime()
-      ->Unit(benchmark::kMicrosecond);
 }
+
+BENCHMARK(wakeUp)->Name("wake_up")->Iterations(200)->Unit(benchmark::kMicrosecond);
 
 }  // namespace
 }  // namespace quazor
 
 int main(int argc, char** argv) {
-  quazor::registerQueue<quazor::QuazorQueue>("quazor");
-  quazor::registerQueue<quazor::AsioStrand>("asio strand");
-  quazor::registerQueue<quazor::AsioPool>("asio pool");
-  quazor::registerQueue<quazor::TbbNode>("tbb node");
-  quazor::registerQueue<quazor::MoodycamelBulk>("moodycamel bulk");
-  quazor::registerQueue<quazor::MutexQueue>("mutex queue");
+  quazor::registerThroughput<quazor::QuazorQueue>("quazor");
+  quazor::registerThroughput<quazor::AsioStrand>("asio strand");
+  quazor::registerThroughput<quazor::AsioPool>("asio pool");
+  quazor::registerThroughput<quazor::TbbNode>("tbb node");
+  quazor::registerThroughput<quazor::MoodycamelBulk>("moodycamel bulk");
+  quazor::registerThroughput<quazor::MutexQueue>("mutex queue");
   benchmark::Initialize(&argc, argv);
   if (benchmark::ReportUnrecognizedArguments(argc, argv)) return 2;
   benchmark::RunSpecifiedBenchmarks();
