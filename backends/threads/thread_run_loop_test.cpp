@@ -109,7 +109,7 @@ TEST(ThreadRunLoopTest, AThreadThatWaitsUsesLessThanAThousandthOfAProcessor) {
   loop.addSource(source, kRunLoopDefaultMode);
   // On a busy machine a wake-up may cost much; a loop that polls uses too much every time.
   std::chrono::nanoseconds least = kWait;
-  for (int attempt = 0; attempt < 5 && least >= kWait / 1000; ++attempt) {
+  for (int attempt = 0; attempt < 25 && least >= kWait / 1000; ++attempt) {
     const auto before = processorTimeOfThisThread();
     EXPECT_EQ(loop.runInMode(kRunLoopDefaultMode, kWait, false), RunLoopResult::kTimedOut);
     least = std::min(least, processorTimeOfThisThread() - before);
