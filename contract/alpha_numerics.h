@@ -1,4 +1,4 @@
-// Which texts are made of letters, marks and digits alone.
+// Tests whether a text consists only of letters, marks and numbers.
 #pragma once
 
 #include "contract/contract.h"

@@ -1,11 +1,11 @@
-// The table behind contract/alpha_numerics.h; no header of the contract.
+// The table used by contract/alpha_numerics.h. Internal; not part of the contract.
 #pragma once
 
 #include <span>
 
 namespace quazor {
 
-// A range of code points; both ends belong to it.
+// A closed range of code points.
 struct CodePointRange {
   char32_t first;
   char32_t last;

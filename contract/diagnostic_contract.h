@@ -1,13 +1,13 @@
-// The contract of experiments and analyses with the host.
+// The contract between the host and experiments and analyses.
 //
-// The host makes an experiment by its factory, asks its description, sets it up, runs it and, where it has a teardown,
-// tears it down, after a failed run too. Then it makes the analysis, asks its description, sets it up where it has a
-// setup, and hands it the experiment's result. No instance serves a second run.
+// The host creates an experiment with its factory, asks for its description, sets it up, runs it and, if it has a
+// teardown, tears it down, even after a failed run. The host then creates the analysis, asks for its description, sets
+// it up if it has a setup, and passes it the experiment's result. No instance is used for a second run.
 //
 // Thread: the host calls an instance's operations one at a time, on one thread of its own, and each blocks until it
 //   is done.
-// Errors: an operation that fails returns false or null and, when the caller gave it a place, stores an error there.
-//   Nothing is thrown.
+// Errors: an operation that fails returns false or null and stores an error if the caller passed a pointer for it.
+//   Operations do not throw.
 #pragma once
 
 #include "contract/contract.h"
@@ -19,7 +19,7 @@
 
 namespace QUAZOR_CONTRACT {
 
-// The host as an experiment or analysis may see it in its setup. It offers nothing yet.
+// The interface of the host that a setup receives. It has no operations yet.
 // Thread: one at a time.
 class QUAZOR_EXPORT QZDiagnosticHost {
  public:
@@ -36,14 +36,14 @@ class QUAZOR_EXPORT QZExperiment {
   virtual ~QZExperiment();
 
   virtual QZDescription experimentDescription() const = 0;
-  // The result, which the caller owns, or null.
+  // Returns the result, owned by the caller, or null on failure.
   virtual std::unique_ptr<QZExperimentResult> run(DiagnosticErrorPtr* error) = 0;
-  // `parameters` holds a number per declared parameter; one that is missing reads as 0. `host` may be null. The
-  // default takes no parameters and succeeds.
+  // `parameters` contains one number per declared parameter; a missing one reads as 0. `host` may be null. The
+  // default implementation ignores the parameters and succeeds.
   virtual bool setupWithParameters(const Dictionary& parameters, QZDiagnosticHost* host, DiagnosticErrorPtr* error);
 };
 
-// The optional last operation of an experiment; one that has it inherits this too.
+// The optional last operation of an experiment, which inherits this class in addition to QZExperiment.
 // Thread: the host's, as QZExperiment.
 class QUAZOR_EXPORT QZTeardown {
  public:
@@ -62,18 +62,18 @@ class QUAZOR_EXPORT QZAnalysis {
   virtual ~QZAnalysis();
 
   virtual QZDescription analysisDescription() const = 0;
-  // The result, which the caller owns, or null.
+  // Returns the result, owned by the caller, or null on failure.
   virtual std::unique_ptr<QZAnalysisResult> analyzeExperimentResult(const QZExperimentResult& result,
                                                                     DiagnosticErrorPtr* error) = 0;
 };
 
-// The optional setup of an analysis; one that has it inherits this too.
+// The optional setup of an analysis, which inherits this class in addition to QZAnalysis.
 // Thread: the host's, as QZAnalysis.
 class QUAZOR_EXPORT QZAnalysisSetup {
  public:
   virtual ~QZAnalysisSetup();
 
-  // As QZExperiment::setupWithParameters.
+  // See QZExperiment::setupWithParameters.
   virtual bool setupWithParameters(const Dictionary& parameters, QZDiagnosticHost* host, DiagnosticErrorPtr* error) = 0;
 };
 

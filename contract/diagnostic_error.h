@@ -1,4 +1,4 @@
-// DiagnosticError: how every operation that can fail tells its failure.
+// DiagnosticError: the error reported by an operation that fails.
 #pragma once
 
 #include "contract/contract.h"
@@ -22,10 +22,10 @@ inline constexpr std::string_view QZNimbeImageExperimentErrorDomain = "QZNimbeIm
 inline constexpr std::string_view localizedDescriptionKey = "localized-description";  // the message, a string
 inline constexpr std::string_view underlyingErrorKey = "underlying-error";            // the error that caused this one
 
-// A failure: a domain, a code that is unique in it, and a dictionary that holds the message and, where another error
+// An error: a domain, a code that is unique in the domain, and a dictionary with the message and, if another error
 // caused this one, that error. Immutable; any thread may read it.
 //
-// Failure itself is told by an operation's return value, never by its error: an out-argument may hold an error after
+// The return value of an operation indicates failure, never its error: an out-argument may hold an error after
 // a success, and may be empty after a failure.
 // Thread: any.
 class QUAZOR_EXPORT DiagnosticError {
@@ -36,7 +36,7 @@ class QUAZOR_EXPORT DiagnosticError {
   std::int64_t code() const { return code_; }
   const Dictionary& userInfo() const { return userInfo_; }
 
-  // The message; an error that was made without one describes itself by domain and code.
+  // The message, or a text with domain and code if the error has no message.
   std::string localizedDescription() const;
   // The error that caused this one, or null.
   DiagnosticErrorPtr underlyingError() const;
@@ -49,23 +49,23 @@ class QUAZOR_EXPORT DiagnosticError {
   Dictionary userInfo_;
 };
 
-// An error with the given message and, unless it is null, the error that caused it.
+// Creates an error with a message and, if `underlying` is not null, the error that caused it.
 QUAZOR_EXPORT DiagnosticErrorPtr errorWithMessage(std::string_view domain, std::int64_t code, std::string message,
                                                   DiagnosticErrorPtr underlying);
 
-// An error whose message is built from a format (contract/message_format.h); it never has an underlying error.
+// Creates an error whose message is built from a format (contract/message_format.h), without an underlying error.
 template <class... Arguments>
 DiagnosticErrorPtr makeError(std::string_view domain, std::int64_t code, MessageFormat<Arguments...> format,
                              const Arguments&... arguments) {
   return errorWithMessage(domain, code, formatMessage(format, arguments...), nullptr);
 }
 
-// Stores an error where the caller asked for one; null empties what the caller had there.
+// Stores `error` in the caller's variable if the pointer is not null. A null error clears the variable.
 inline void storeError(DiagnosticErrorPtr* out, DiagnosticErrorPtr error) {
   if (out != nullptr) *out = std::move(error);
 }
 
-// Builds an error and stores it, both only where the caller asked for one. `underlying` may be null.
+// Builds and stores an error if the caller passed a pointer for it. `underlying` may be null.
 template <class... Arguments>
 void fail(DiagnosticErrorPtr* out, std::string_view domain, std::int64_t code, const DiagnosticErrorPtr& underlying,
           MessageFormat<Arguments...> format, const Arguments&... arguments) {

@@ -1,4 +1,4 @@
-// QZLab: what plug-ins have registered.
+// QZLab: the registry of experiments, analyses and diagnostics.
 #pragma once
 
 #include "contract/contract.h"
@@ -12,19 +12,19 @@
 
 namespace QUAZOR_CONTRACT {
 
-// Factories make a new instance on every call.
+// Factories return a new instance on every call.
 using QZExperimentFactory = std::function<std::shared_ptr<QZExperiment>()>;
 using QZAnalysisFactory = std::function<std::shared_ptr<QZAnalysis>()>;
 
-// Names are public and permanent: they stand in scripts and records. A name that is taken is not registered again;
-// the first registration stays and the refusal is kept for the host to act on.
+// Names are public and permanent, because scripts and records use them. A name can be registered only once: the first
+// registration stays, and later ones are listed in refusedNames() for the host.
 //
 // Thread: registrations come from plug-ins' initializers, on the thread that loads them; no other call at that time.
 class QUAZOR_EXPORT QZLab {
  public:
   enum class Kind { kExperiment, kAnalysis, kDiagnostic };
 
-  // One registration, in the terms in which it was made; what its kind does not have is empty.
+  // One registration. Members that do not apply to its kind are empty.
   struct Registration {
     Kind kind;
     std::string name;
@@ -39,7 +39,7 @@ class QUAZOR_EXPORT QZLab {
   QZLab(const QZLab&) = delete;
   QZLab& operator=(const QZLab&) = delete;
 
-  // The process-wide lab. Never released.
+  // The process-wide lab; never destroyed.
   static QZLab& defaultLab();
 
   void addExperimentWithName(std::string_view name, QZExperimentFactory block);
@@ -47,11 +47,11 @@ class QUAZOR_EXPORT QZLab {
   void addDiagnosticWithName(std::string_view name, std::string_view summary, std::string_view experimentName,
                              std::string_view analysisName);
 
-  // All registrations, in the order in which they were made.
+  // All registrations, in order.
   const std::vector<Registration>& registrations() const { return registrations_; }
-  // The names that a registration of the same kind had already taken, in order.
+  // The names whose registration was refused because the same kind already had that name, in order.
   const std::vector<std::string>& refusedNames() const { return refusedNames_; }
-  // The registration of that kind and name, or null; valid until the next registration.
+  // Returns the registration with that kind and name, or null. The pointer is valid until the next registration.
   const Registration* find(Kind kind, std::string_view name) const;
 
  private:

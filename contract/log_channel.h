@@ -2,8 +2,8 @@
 //
 //   logError("Failed to set the multicam config! %@", underlying);
 //
-// A line whose level is disabled costs a load and a branch: its arguments are taken by reference and nothing is
-// formatted, copied or allocated. So pass values and errors as they are, never their texts.
+// A line whose level is disabled costs a load and a branch: arguments are passed by reference, and nothing is
+// formatted, copied or allocated. Pass values and errors directly instead of converting them to text.
 #pragma once
 
 #include "contract/contract.h"
@@ -19,7 +19,7 @@ namespace QUAZOR_CONTRACT {
 
 enum class LogLevel : int { kError = 1, kDefault = 2, kDebug = 3 };
 
-// Where log lines go: a platform service.
+// The destination of log lines; a platform service.
 // Thread: any.
 class QUAZOR_EXPORT LogBackend {
  public:
@@ -28,7 +28,7 @@ class QUAZOR_EXPORT LogBackend {
   LogBackend& operator=(const LogBackend&) = delete;
   virtual ~LogBackend();
 
-  // Takes one finished line; the texts are borrowed for the call.
+  // Writes one formatted line. The texts are valid only during the call.
   //
   // Thread: any, several at once. Must not throw, must not write to the log, and must not take a lock that a caller
   //   of the log may hold. A line that cannot be written is dropped.
@@ -45,11 +45,11 @@ class QUAZOR_EXPORT LogChannel {
   const std::string& subsystem() const { return subsystem_; }
   const std::string& category() const { return category_; }
 
-  // Hands a finished line to the back-end, whatever its level; without a back-end it is dropped.
+  // Passes a formatted line to the back end regardless of its level. Without a back end, the line is dropped.
   void write(LogLevel level, std::string_view text);
 
-  // From now on lines of `level` and of the levels before it go to `backend`. Null drops and disables all lines, as
-  // it is before the first call. A line that is being written on another thread may still go to the back-end before.
+  // Sends lines of `level` and more severe levels to `backend` from now on. A null backend disables all lines, which
+  // is also the initial state. A line that another thread is writing may still go to the previous back end.
   void setBackend(std::shared_ptr<LogBackend> backend, LogLevel level);
 
   static bool isEnabled(LogLevel level) {
@@ -68,10 +68,10 @@ class QUAZOR_EXPORT LogChannel {
   std::shared_ptr<LogBackend> backend_;  // guarded by mutex_
 };
 
-// The process-wide channel, made on first use and never released. Any thread.
+// The process-wide channel, created on first use and never destroyed. Any thread.
 QUAZOR_EXPORT LogChannel& sharedLog();
 
-// Out of line, so that a disabled line is no more than its test.
+// Out of line, so that the code of a disabled line is only the level check.
 template <class... Arguments>
 [[gnu::noinline, gnu::cold]] void writeLogLine(LogLevel level, MessageFormat<Arguments...> format,
                                                const Arguments&... arguments) {

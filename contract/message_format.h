@@ -1,4 +1,4 @@
-// Messages: error texts, log lines and CSV lines are built here, from printf-style formats that also take "%@".
+// Builds error messages, log lines and CSV lines from printf-style formats with the additional placeholder "%@".
 //
 //   %@   any value's default text; an absent value reads (null)
 //   %lu  an unsigned integer, in decimal
@@ -6,8 +6,8 @@
 //   %d   a signed integer of at most 32 bits, in decimal
 //   %%   a percent sign
 //
-// A format is checked against its arguments when it is compiled. Text that is inserted is never read as a format, and
-// no locale has any influence.
+// The compiler checks a format against its arguments. Inserted text is never interpreted as a format, and the locale
+// has no effect.
 //
 // Default texts: integers in decimal; booleans 1 and 0; floating point the shortest form that reads back to the same
 // number (36.6, 0.5, 3); strings as they are; arrays (a, b); dictionaries {k = v; k2 = v2}; dates in UTC as
@@ -29,7 +29,7 @@
 
 namespace QUAZOR_CONTRACT {
 
-// One argument of a message: a number, or a pointer to what is to be inserted. Borrows; lives for one call.
+// One argument of a message: a number, or a pointer to the object to insert. Does not own it; valid for one call.
 // Thread: one at a time.
 class MessageArgument {
  public:
@@ -117,7 +117,7 @@ class MessageArgument {
   std::size_t size_ = 0;  // of a text
 };
 
-// Which placeholders an argument type fits; every printable type fits "%@".
+// The placeholders that an argument type matches. Every printable type matches "%@".
 template <class T>
 concept FitsUnsignedPlaceholder = ValueInteger<T> && std::unsigned_integral<T>;
 template <class T>
@@ -125,7 +125,7 @@ concept FitsFloatingPlaceholder = std::same_as<T, double> || std::same_as<T, flo
 template <class T>
 concept FitsSignedPlaceholder = ValueInteger<T> && std::signed_integral<T> &&(sizeof(T) <= sizeof(int));
 
-// What is wrong with a format, for its argument types.
+// The defect of a format, given its argument types.
 enum class FormatFault { kNone, kUnknownPlaceholder, kTooFewArguments, kTooManyArguments, kArgumentOfWrongType };
 
 template <class... Arguments>
@@ -154,7 +154,7 @@ constexpr FormatFault checkFormat(std::string_view format) {
   return used == count ? FormatFault::kNone : FormatFault::kTooManyArguments;
 }
 
-// Never defined: calling them is what stops the compilation, and their names are what the compiler prints.
+// Never defined: calling one of these stops the compilation, and the compiler prints its name.
 void theFormatHasAPlaceholderThatIsNotKnown();
 void theFormatHasMorePlaceholdersThanArguments();
 void theFormatHasFewerPlaceholdersThanArguments();
@@ -183,11 +183,11 @@ class CheckedFormat {
 template <class... Arguments>
 using MessageFormat = CheckedFormat<std::type_identity_t<Arguments>...>;
 
-// Appends to `out` the message that `format` and as many arguments as it has placeholders make. The format has been
-// checked: callers go through formatMessage.
+// Appends the formatted message to `out`. There must be one argument per placeholder; use formatMessage, which checks
+// the format.
 QUAZOR_EXPORT void appendMessage(std::string& out, std::string_view format, const MessageArgument* arguments);
 
-// The message that a format and its arguments make.
+// Returns the formatted message.
 template <class... Arguments>
 std::string formatMessage(MessageFormat<Arguments...> format, const Arguments&... arguments) {
   std::string message;

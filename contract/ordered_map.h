@@ -1,4 +1,4 @@
-// OrderedMap: string keys to values, kept in the order of their insertion.
+// OrderedMap: a map from strings to values that keeps insertion order.
 #pragma once
 
 #include "contract/contract.h"
@@ -18,7 +18,7 @@ namespace QUAZOR_CONTRACT {
 
 // A dictionary that iterates in insertion order and finds a key in constant time on average.
 //
-// Setting a key that is already there replaces its value and keeps its place. A looked-up pointer is valid until the
+// Setting an existing key replaces its value and keeps its position. A pointer returned by a lookup is valid until the
 // next set() or erase(). Looking a key up never inserts it. Copies are independent.
 // Thread: one at a time; any number may read while none writes.
 template <class T>
@@ -55,12 +55,12 @@ class OrderedMap {
     }
   }
 
-  // The value under `key`, or null.
+  // Returns the value of `key`, or null.
   const T* find(std::string_view key) const { return valueOf(const_cast<OrderedMap*>(this)->findEntry(key)); }
   T* find(std::string_view key) { return valueOf(findEntry(key)); }
   bool contains(std::string_view key) const { return find(key) != nullptr; }
 
-  // Removes `key`; true when it was there. Linear in the number of entries.
+  // Removes `key` and returns whether it existed. Linear in the number of entries.
   bool erase(std::string_view key) {
     Entry* entry = findEntry(key);
     if (entry == nullptr) return false;
@@ -70,7 +70,7 @@ class OrderedMap {
     return true;
   }
 
-  // Makes room for `count` entries in all.
+  // Reserves space for a total of `count` entries.
   void reserve(std::size_t count) {
     entries_.reserve(count);
     if (count > kScanLimit && slots_.size() < count * 2) rebuildIndex(count);
@@ -80,7 +80,7 @@ class OrderedMap {
   const_iterator begin() const { return entries_.begin(); }
   const_iterator end() const { return entries_.end(); }
 
-  // Equal when both hold the same keys with equal values, in whatever order.
+  // Compares keys and values, regardless of their order.
   friend bool operator==(const OrderedMap& a, const OrderedMap& b) {
     if (a.size() != b.size()) return false;
     for (const Entry& entry : a) {
@@ -91,11 +91,11 @@ class OrderedMap {
   }
 
  private:
-  // Up to this many entries a scan beats hashing, and most dictionaries are this small.
+  // Up to this many entries a linear scan is faster than hashing; most dictionaries are this small.
   static constexpr std::size_t kScanLimit = 8;
 
-  // One place of the open-addressing index: an entry's position plus one (0 is a free place), and enough of its hash
-  // to pass over most strangers without touching their keys.
+  // One slot of the open-addressing index: the entry's position plus one (0 marks a free slot), and enough of the hash
+  // to skip most other entries without comparing keys.
   struct Slot {
     std::uint32_t place = 0;
     std::uint32_t hash = 0;

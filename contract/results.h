@@ -1,4 +1,4 @@
-// The records that pass between host and plug-in.
+// The data exchanged between host and plug-in.
 #pragma once
 
 #include "contract/contract.h"
@@ -29,7 +29,7 @@ class QZNumberParameter {
   bool required_;
 };
 
-// What an experiment or an analysis says of itself: a summary and named parameters, in the order of their adding.
+// The description of an experiment or analysis: a summary and named parameters, in insertion order.
 // Thread: one at a time; any number may read while none writes.
 class QZDescription {
  public:
@@ -46,7 +46,7 @@ class QZDescription {
   OrderedMap<QZNumberParameter> parameters_;
 };
 
-// What an experiment measured. Made empty; the experiment fills it, the host owns it from then on.
+// The measurements of an experiment. Initially empty; the experiment fills it and passes ownership to the host.
 // Thread: one at a time; any number may read while none writes.
 class QZExperimentResult {
  public:
@@ -60,7 +60,7 @@ class QZExperimentResult {
   Dictionary auxiliaryData_;
 };
 
-// One end of a limit. An open bound leaves its own value out of the accepted range.
+// One end of a limit. An open bound excludes its own value from the accepted range.
 // Thread: any; it is immutable.
 class QZBound {
  public:
@@ -74,7 +74,7 @@ class QZBound {
   bool open_;
 };
 
-// The accepted range of a measured result; a bound that is not set does not limit. Both bounds may be one object.
+// The accepted range of a measured result. A missing bound does not restrict it. Both bounds may be the same object.
 // Thread: one at a time; any number may read while none writes.
 class QZLimit {
  public:
@@ -94,7 +94,7 @@ class QZLimit {
   std::shared_ptr<const QZBound> upperBound_;
 };
 
-// A named measurement that the host judges against its limit; one without a limit is for information.
+// A named measurement that the host compares with its limit. A result without a limit is informational.
 // Thread: one at a time; any number may read while none writes.
 class QZMeasuredResult {
  public:
@@ -112,7 +112,7 @@ class QZMeasuredResult {
   std::optional<QZLimit> limit_;
 };
 
-// What an analysis found, in the order in which it looked. Made empty.
+// The results of an analysis, in order. Initially empty.
 // Thread: one at a time; any number may read while none writes.
 class QZAnalysisResult {
  public:

@@ -8,15 +8,14 @@
 
 namespace QUAZOR_CONTRACT {
 
-// A unit, known by its symbol. There is one object per symbol in a process, so units compare by address; none is ever
-// released.
+// A unit, identified by its symbol. A process has one object per symbol, never destroyed, so units compare by address.
 // Thread: any.
 class QUAZOR_EXPORT QZUnit {
  public:
   QZUnit(const QZUnit&) = delete;
   QZUnit& operator=(const QZUnit&) = delete;
 
-  // The unit with this symbol, made on first use. Any thread.
+  // Returns the unit with this symbol, created on first use. Any thread.
   static const QZUnit& unitWithSymbol(std::string_view symbol);
 
   const std::string& symbol() const { return symbol_; }

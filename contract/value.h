@@ -26,7 +26,7 @@ class Value;
 using Array = std::vector<Value>;
 using Dictionary = OrderedMap<Value>;
 using Bytes = std::vector<std::uint8_t>;
-// A moment of the wall clock, to the nanosecond.
+// A point in wall clock time, with nanosecond resolution.
 using Date = std::chrono::sys_time<std::chrono::nanoseconds>;
 
 // What a Value can refer to without copying it: a platform object (a stream, a group) or a handler.
@@ -38,7 +38,7 @@ class QUAZOR_EXPORT Object {
   Object& operator=(const Object&) = delete;
   virtual ~Object();
 
-  // One line that tells a reader of the log which object this is.
+  // One line that identifies the object in a log.
   virtual std::string description() const = 0;
 };
 
@@ -51,9 +51,9 @@ concept ValueInteger =
 // A number (boolean, signed, unsigned, double, 32-bit float), a string, an array, a dictionary, a date, bytes, a
 // shared reference to an Object, or an error.
 //
-// Copied deeply in meaning: what a Value holds never changes, so copies share it and cost a reference count. A number
-// keeps the kind it was made of. There is no null Value; "no value" is an empty std::optional or a null pointer.
-// A Value that was moved from may only be assigned to or destroyed; one of a null object or error prints (null).
+// Behaves like a deep copy: the content never changes, so copies share it at the cost of a reference count. A number
+// keeps its type. There is no null Value; "no value" is an empty std::optional or a null pointer.
+// A moved-from Value may only be assigned to or destroyed. A Value of a null object or error prints (null).
 // Thread: one at a time; any number may read while none assigns.
 class QUAZOR_EXPORT Value {
  public:
@@ -98,7 +98,8 @@ class QUAZOR_EXPORT Value {
   Kind kind() const { return static_cast<Kind>(data_.index()); }
   bool isNumber() const { return kind() <= Kind::kFloat; }
 
-  // The content when it is of that kind, else null. Valid as long as a copy of this Value lives and is not assigned to.
+  // Returns the content if it has that type, else null. Valid until this Value and all its copies are destroyed or
+  // assigned to.
   const bool* boolean() const { return std::get_if<bool>(&data_); }
   const std::int64_t* signedInteger() const { return std::get_if<std::int64_t>(&data_); }
   const std::uint64_t* unsignedInteger() const { return std::get_if<std::uint64_t>(&data_); }
@@ -114,8 +115,8 @@ class QUAZOR_EXPORT Value {
   // The error it holds, or null.
   DiagnosticErrorPtr error() const;
 
-  // Equal when kind and content are: 1, 1u, 1.0 and true are four different values. Dictionaries compare without
-  // regard to order, objects and errors by identity.
+  // Compares type and content: 1, 1u, 1.0 and true are four different values. Dictionaries compare regardless of order,
+  // objects and errors by identity.
   friend QUAZOR_EXPORT bool operator==(const Value& a, const Value& b);
 
  private:
@@ -131,21 +132,21 @@ class QUAZOR_EXPORT Value {
       data_;
 };
 
-// Reading numbers. One family with one rule: null, and a value that is not a number, reads as 0. A double becomes an
-// integer by truncation toward zero and saturates at the integer's limits; not-a-number becomes 0. An integer becomes
-// a narrower integer by keeping its low bits, and signed and unsigned 64-bit integers reinterpret each other.
+// Functions that read numbers. Null, and a value that is not a number, read as 0. Conversion of a double to an integer
+// truncates toward zero and saturates at the limits of the integer; NaN becomes 0. Conversion to a narrower integer
+// keeps the low bits, and signed and unsigned 64-bit integers are reinterpreted as each other.
 QUAZOR_EXPORT double toDouble(const Value* value);
 QUAZOR_EXPORT std::int64_t toSigned(const Value* value);
 QUAZOR_EXPORT std::uint64_t toUnsigned(const Value* value);
 QUAZOR_EXPORT std::int32_t toInt32(const Value* value);
 QUAZOR_EXPORT std::uint16_t toUInt16(const Value* value);
-// True when the number is neither 0 nor not-a-number.
+// Returns true if the number is neither 0 nor NaN.
 QUAZOR_EXPORT bool toBoolean(const Value* value);
 
-// The entry under `key` of a value that is a dictionary; null for any other value, and for null.
+// Returns the entry `key` of a dictionary; null for any other value and for null.
 QUAZOR_EXPORT const Value* entryOf(const Value* value, std::string_view key);
 
-// A pointer to what an optional holds, or null: the readers above take pointers.
+// Returns a pointer to the content of an optional, or null, for use with the functions above.
 inline const Value* pointerTo(const std::optional<Value>& value) { return value ? &*value : nullptr; }
 
 }  // namespace QUAZOR_CONTRACT

@@ -1,5 +1,5 @@
-// Port types, and the property keys of capture devices, groups and streams: every string that plug-ins and capture
-// services must spell alike.
+// Port types and the property keys of capture devices, groups and streams: the strings shared by plug-ins and capture
+// services.
 #pragma once
 
 #include "contract/contract.h"
@@ -8,7 +8,7 @@
 
 namespace QUAZOR_CONTRACT {
 
-// Where a camera looks and what it is.
+// The position and type of a camera.
 namespace port_type {
 inline constexpr std::string_view BackFacingCamera = "BackFacingCamera";
 inline constexpr std::string_view BackFacingTelephotoCamera = "BackFacingTelephotoCamera";
@@ -34,7 +34,7 @@ inline constexpr std::string_view TimeMachineEnabled = "TimeMachineEnabled";    
 inline constexpr std::string_view MasterToSlaveFrameRateRatio = "MasterToSlaveFrameRateRatio";  // integer
 
 inline constexpr std::string_view AEEnabled = "AEEnabled";  // boolean: automatic exposure
-// Dictionary of the three integers below it: how the infrared light sources fire.
+// Dictionary of the three integers below it, which configure the infrared light sources.
 inline constexpr std::string_view InfraredLightSourceConfiguration = "InfraredLightSourceConfiguration";
 inline constexpr std::string_view Mode = "Mode";
 inline constexpr std::string_view StructuredLightPattern = "StructuredLightPattern";
@@ -67,9 +67,9 @@ inline constexpr std::string_view MultiCamConfiguration = "MultiCamConfiguration
 inline constexpr std::string_view ActiveSynchronizedStreamsGroups = "ActiveSynchronizedStreamsGroups";
 // Dictionary, port type to a dictionary of the two entries below it; read only.
 inline constexpr std::string_view MulticamSessionStatus = "MulticamSessionStatus";
-// Number: by how many frames the camera's first frame came after the session's.
+// Number of frames between the session's first frame and the camera's first frame.
 inline constexpr std::string_view Offset = "Offset";
-// Number: frames since the camera's first; negative when it recorded none.
+// Number of frames since the camera's first; negative if it recorded none.
 inline constexpr std::string_view FrameCount = "FrameCount";
 
 // Of pixel buffers: the attachment that holds the frame's metadata, a dictionary, and what it holds among others.

@@ -2,14 +2,13 @@
 // port) and its groups of synchronised streams.
 //
 // Thread: every call is synchronous on the caller's thread and may block as long as the hardware takes. One thread at
-//   a time calls into one device and its streams, but for one thing: frames come as soon as a stream is started, and
-//   whoever handles them may read the stream's properties and stop it while its start has not yet returned. Different
-//   devices are independent.
-// Ownership: objects are shared; what a call returns stays valid, if perhaps of no more use, for as long as the caller
-//   holds it. The same stream is the same object on every path that leads to it, so streams compare by identity.
-// Errors: a call that fails returns false or nothing and then stores the service's own error where the caller gave a
-//   place for one; it may have none to give, and stores nothing. After a success the place is as it was. Nothing is
-//   thrown.
+//   a time calls into one device and its streams, with one exception: frames may arrive before the call that starts a
+//   stream has returned, and a frame handler may then read the stream's properties and stop it. Different devices are
+//   independent.
+// Ownership: objects are shared; a returned object stays valid, though perhaps no longer usable, for as long as the
+//   caller holds it. Every path to a stream returns the same object, so streams compare by identity.
+// Errors: a call that fails returns false or nothing and stores the service's error if the caller passed a pointer and
+//   the service has an error to give. A successful call leaves the pointer's target unchanged. Calls do not throw.
 #pragma once
 
 #include "contract/contract.h"
@@ -24,16 +23,16 @@
 
 namespace QUAZOR_CONTRACT {
 
-// What has properties (platform/capture_keys.h): a device, a group, a stream.
+// An object with properties (platform/capture_keys.h): a device, a group or a stream.
 // Thread: one at a time for a device and what belongs to it; a frame handler may read properties meanwhile.
 class QUAZOR_EXPORT CaptureObject : public Object {
  public:
   ~CaptureObject() override;
 
-  // The property's value; nothing when it cannot be read or the object has no such property.
+  // Returns the property's value, or nothing if it cannot be read or does not exist.
   virtual std::optional<Value> valueForProperty(std::string_view key, DiagnosticErrorPtr* error) = 0;
-  // Sets a property. Refused when the object has no such property, the property is read only, or the value is of the
-  // wrong kind or out of range; the property then keeps its value.
+  // Sets a property. Fails if the property does not exist or is read only, or if the value has the wrong type or is out
+  // of range; the property then keeps its value.
   virtual bool setValue(const Value& value, std::string_view key, DiagnosticErrorPtr* error) = 0;
 };
 
@@ -42,9 +41,9 @@ class QUAZOR_EXPORT CaptureStream : public CaptureObject {
  public:
   ~CaptureStream() override;
 
-  // Starts delivering frames. Refused without control of the stream, and while it runs.
+  // Starts delivering frames. Fails without control of the stream and while the stream runs.
   virtual bool start(DiagnosticErrorPtr* error) = 0;
-  // Stops delivering frames; when it returns, no handler is running or will run. Refused while it does not run.
+  // Stops delivering frames. After it returns, no handler is running or will run. Fails if the stream is not running.
   virtual bool stop(DiagnosticErrorPtr* error) = 0;
 };
 using CaptureStreams = std::vector<std::shared_ptr<CaptureStream>>;
@@ -69,11 +68,11 @@ class QUAZOR_EXPORT CaptureDevice : public CaptureObject {
   virtual std::optional<CaptureStreams> streams(DiagnosticErrorPtr* error) = 0;
   // The groups of streams that can be synchronised, in a fixed order.
   virtual std::optional<SynchronizedStreamsGroups> synchronizedStreamsGroups(DiagnosticErrorPtr* error) = 0;
-  // Takes the streams for this user: all of them or, on failure, none.
+  // Acquires control of the streams for this client: all of them or, on failure, none.
   virtual bool requestControlOfStreams(const CaptureStreams& streams, DiagnosticErrorPtr* error) = 0;
-  // Gives the streams back.
+  // Releases control of the streams.
   virtual bool relinquishControlOfStreams(const CaptureStreams& streams, DiagnosticErrorPtr* error) = 0;
-  // Ends the use of the device: its streams stop, their control is given back, and every later call is refused.
+  // Ends the use of the device: stops its streams and releases their control. Every later call fails.
   virtual bool invalidate(DiagnosticErrorPtr* error) = 0;
 };
 
@@ -86,7 +85,7 @@ class QUAZOR_EXPORT CapturePlugIn : public Object {
   virtual std::shared_ptr<CaptureDevice> device(DiagnosticErrorPtr* error) = 0;
 };
 
-// Where a capture plug-in comes from.
+// Provides the capture plug-in.
 // Thread: any.
 class QUAZOR_EXPORT CaptureService {
  public:

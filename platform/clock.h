@@ -8,7 +8,7 @@
 
 namespace QUAZOR_CONTRACT {
 
-// Seconds as nanoseconds: truncated toward zero, saturating; not-a-number is 0.
+// Converts seconds to nanoseconds: truncates toward zero and saturates; NaN becomes 0.
 QUAZOR_EXPORT std::chrono::nanoseconds nanosecondsFromSeconds(double seconds);
 
 // Thread: any.
@@ -23,7 +23,7 @@ class QUAZOR_EXPORT Clock {
   virtual std::chrono::nanoseconds now() const = 0;
   // The wall clock.
   virtual Date date() const = 0;
-  // Blocks the calling thread for that long; zero and less return at once.
+  // Blocks the calling thread for that duration; returns at once if it is zero or negative.
   virtual void sleep(std::chrono::nanoseconds duration) = 0;
 };
 

@@ -12,11 +12,11 @@ namespace QUAZOR_CONTRACT {
 
 // Runs tasks one at a time, in the order of their submission.
 //
-// Any thread may submit, a task of the queue itself included. A task object is destroyed as soon as it has run,
+// Any thread may submit tasks, including a task of the queue itself. A task object is destroyed after it has run and
 // before the next one starts. A task must not throw.
 //
-// Destroying a queue never blocks, and may happen in one of its own tasks: tasks that were due still run, those whose
-// delay had not yet passed are destroyed without running.
+// Destroying a queue never blocks, and a task may destroy its own queue: tasks that were due still run, and tasks whose
+// delay had not expired are destroyed without running.
 // Thread: any.
 class QUAZOR_EXPORT SerialQueue {
  public:
@@ -27,8 +27,9 @@ class QUAZOR_EXPORT SerialQueue {
 
   // Submits a task; returns without waiting for it.
   virtual void async(Task task) = 0;
-  // Submits a task that becomes due `delay` from now: behind the tasks that are waiting then, in the order of the due
-  // times. Zero and less are due at once. A delay beyond the clock's range never fires early.
+  // Submits a task that becomes due `delay` from now. It then runs after the tasks already waiting; delayed tasks run
+  // in the order of their due times. Zero or a negative delay is due at once. A delay beyond the clock's range never
+  // expires early.
   virtual void asyncAfter(std::chrono::nanoseconds delay, Task task) = 0;
 };
 
@@ -43,7 +44,7 @@ class QUAZOR_EXPORT Semaphore {
 
   // Adds one and wakes one waiter.
   virtual void signal() = 0;
-  // Blocks until the count is above zero, then takes one.
+  // Blocks until the count is above zero, then decrements it.
   virtual void wait() = 0;
 };
 
@@ -59,7 +60,7 @@ class QUAZOR_EXPORT Concurrency {
   Concurrency& operator=(const Concurrency&) = delete;
   virtual ~Concurrency();
 
-  // `label` names the queue to people who look at threads and traces.
+  // `label` names the queue in lists of threads and in traces.
   virtual std::shared_ptr<SerialQueue> makeSerialQueue(std::string_view label, QualityOfService quality) = 0;
   virtual std::shared_ptr<Semaphore> makeSemaphore(long count) = 0;
 };

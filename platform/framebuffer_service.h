@@ -1,8 +1,8 @@
-// The framebuffer driver of the phone's displays, as far as diagnostics ask it: what the driver publishes about itself.
+// The properties that the framebuffer driver of the phone's displays publishes.
 //
 // Thread: every call is synchronous on the caller's thread.
-// Ownership: objects are shared; what a call returns stays valid for as long as the caller holds it.
-// Errors: null or nothing; nothing is thrown.
+// Ownership: objects are shared; a returned object stays valid for as long as the caller holds it.
+// Errors: a call that fails returns null or nothing and does not throw.
 #pragma once
 
 #include "contract/contract.h"
@@ -20,7 +20,7 @@ class QUAZOR_EXPORT RegistryService : public Object {
  public:
   ~RegistryService() override;
 
-  // A copy of the property as it is now, or nothing when there is none of that name.
+  // Returns a copy of the property's current value, or nothing if it does not exist.
   virtual std::optional<Value> registryProperty(std::string_view name) = 0;
 };
 

@@ -1,11 +1,11 @@
-// Human interface devices: matching, opening, feature reports out, input reports in.
+// Human interface devices: finding and opening devices, sending feature reports, receiving input reports.
 //
 // Thread: every call is synchronous on the caller's thread and may block as long as the device takes. One thread at a
-//   time calls into one device. Input reports come on the thread of the run loop that the device is scheduled on, while
-//   that loop runs.
-// Ownership: objects are shared; a device stays usable for as long as the caller holds it, the manager need not.
-// Errors: a call that fails returns false and then stores the device's own error where the caller gave a place for one;
-//   it may have none to give, and stores nothing. Nothing is thrown.
+//   time calls into one device. Input reports arrive on the thread of the run loop on which the device is scheduled,
+//   while that loop runs.
+// Ownership: objects are shared; a device stays usable for as long as the caller holds it, even without its manager.
+// Errors: a call that fails returns false and stores the device's error if the caller passed a pointer and the device
+//   has an error to give. Calls do not throw.
 #pragma once
 
 #include "contract/contract.h"
@@ -30,39 +30,39 @@ inline constexpr std::string_view kHidPrimaryUsage = "PrimaryUsage";
 // Thread: one at a time; input reports come on the thread of the run loop that the device is scheduled on.
 class QUAZOR_EXPORT HidDevice : public Object {
  public:
-  // A report that came in: its ID and all its bytes, the ID first. With an error there is no report, the ID is 0 and
-  // the data empty. The bytes are valid during the call.
+  // Receives a report: its ID and all its bytes, including the ID as the first byte. If `error` is set there is no
+  // report: the ID is 0 and the data is empty. The bytes are valid only during the call.
   using InputReportCallback =
       std::function<void(std::uint8_t reportID, std::span<const std::uint8_t> data, const DiagnosticErrorPtr& error)>;
 
   ~HidDevice() override;
 
-  // Opens the device for this user. Refused when it is open or gone.
+  // Opens the device for this client. Fails if the device is already open or was removed.
   virtual bool open(DiagnosticErrorPtr* error) = 0;
-  // Replaces the receiver of input reports; an empty one removes it. May be called by the receiver itself, which is
-  // then destroyed only after it has returned.
+  // Replaces the receiver of input reports; an empty one removes it. The receiver may call this itself; it is then
+  // destroyed only after it has returned.
   virtual void setInputReportCallback(InputReportCallback callback) = 0;
-  // Sends a feature report. `payload` is the whole report, the byte of its ID first.
+  // Sends a feature report. `payload` is the whole report, including its ID as the first byte.
   virtual bool setFeatureReportWithID(std::uint8_t reportID, std::span<const std::uint8_t> payload,
                                       DiagnosticErrorPtr* error) = 0;
-  // From now on input reports and errors of the device come through the loop, in this mode; it must be alive until the
+  // Delivers input reports and device errors through `runLoop` in this mode from now on. `runLoop` must live until the
   // device is unscheduled from it. While the device is open and not scheduled, reports are lost and errors are kept.
   virtual void scheduleWithRunLoop(RunLoop& runLoop, std::string_view mode) = 0;
-  // The loop calls the receiver no more. Without effect on a device that is not scheduled there.
+  // Stops delivery through the loop. No effect if the device is not scheduled there.
   virtual void unscheduleFromRunLoop(RunLoop& runLoop, std::string_view mode) = 0;
-  // Closes the device; without effect when it is not open. `options` has no bit that is in use: 0.
+  // Closes the device; no effect if it is not open. `options` is reserved and must be 0.
   virtual void close(std::uint32_t options) = 0;
 };
 
-// One user's view of the devices of the system.
+// One client's view of the devices of the system.
 // Thread: one at a time.
 class QUAZOR_EXPORT HidManager : public Object {
  public:
   ~HidManager() override;
 
-  // Looks for the devices that match one of the dictionaries; a dictionary matches a device that has all its entries.
+  // Selects the devices that match at least one of the dictionaries. A device must have all entries of a dictionary.
   virtual void enumerateDevicesMatching(const std::vector<Dictionary>& matching) = 0;
-  // What was found, each device once.
+  // Returns the matching devices, each once.
   virtual std::vector<std::shared_ptr<HidDevice>> devices() = 0;
 };
 
@@ -74,7 +74,7 @@ class QUAZOR_EXPORT HidService {
   HidService& operator=(const HidService&) = delete;
   virtual ~HidService();
 
-  // A new manager, or null when the system has no HID facility.
+  // Returns a new manager, or null if the system has no HID facility.
   virtual std::shared_ptr<HidManager> createManager() = 0;
 };
 

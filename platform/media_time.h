@@ -1,4 +1,4 @@
-// MediaTime: when a frame or an event of a stream happened.
+// MediaTime: the time stamp of a frame or event of a stream.
 #pragma once
 
 #include "contract/contract.h"

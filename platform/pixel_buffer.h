@@ -14,8 +14,8 @@
 
 namespace QUAZOR_CONTRACT {
 
-// References are counted by hand, as the hardware's buffer pool does it: whoever wants the buffer beyond the call that
-// handed it over takes a reference, and the buffer goes back to its pool with the last one.
+// References are counted manually, as in the hardware's buffer pool: a handler that needs the buffer after its call
+// takes a reference, and the buffer returns to its pool when the last reference is released.
 // Thread: any.
 class QUAZOR_EXPORT PixelBuffer {
  public:
@@ -25,8 +25,8 @@ class QUAZOR_EXPORT PixelBuffer {
 
   virtual void retain() = 0;
   virtual void release() = 0;
-  // What the capture service attached to the frame under `key` (platform/capture_keys.h), or nothing. REQUIRES: the
-  // caller has a reference; the value stays good without it. Attachments do not change.
+  // Returns the frame's attachment `key` (platform/capture_keys.h), or nothing. REQUIRES: the caller holds a reference;
+  // the returned value remains valid without it. Attachments do not change.
   virtual std::optional<Value> attachment(std::string_view key) const = 0;
 
  protected:
@@ -34,7 +34,8 @@ class QUAZOR_EXPORT PixelBuffer {
 };
 
 // Called with every frame of an output, on any thread of the capture service, perhaps several at once. The buffer is
-// borrowed for the call. Must return soon: frames wait behind it. May let go of the last reference to its own stream.
+// valid only during the call. Must return quickly, because it delays further frames. May release the last reference to
+// its own stream.
 // Thread: any of the capture service, perhaps several at once.
 class QUAZOR_EXPORT PixelBufferHandler final : public Object {
  public:
@@ -50,7 +51,7 @@ class QUAZOR_EXPORT PixelBufferHandler final : public Object {
   Function function_;
 };
 
-// Called with every event of an output; as PixelBufferHandler. `info` may be null.
+// Called for every event of an output, under the same rules as PixelBufferHandler. `info` may be null.
 // Thread: any, as PixelBufferHandler.
 class QUAZOR_EXPORT EventHandler final : public Object {
  public:

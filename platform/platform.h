@@ -1,4 +1,4 @@
-// Platform: the services that stand behind a plug-in, in one bundle.
+// Platform: the bundle of services that a plug-in uses.
 #pragma once
 
 #include "contract/contract.h"
@@ -15,8 +15,8 @@
 
 namespace QUAZOR_CONTRACT {
 
-// Each service is its own narrow interface; a class takes the bundle and uses what it needs. No member is null while
-// plug-ins run.
+// Each service is a separate, narrow interface; a class takes the bundle and uses the services it needs. No member is
+// null while plug-ins run.
 struct Platform {
   std::shared_ptr<CaptureService> capture;
   std::shared_ptr<Clock> clock;
@@ -27,8 +27,8 @@ struct Platform {
   std::shared_ptr<RunLoops> runLoops{};
 };
 
-// The platform that plug-ins get when they are handed no other. The host installs it before it makes experiments, on
-// the thread that it runs them on. The log's back-end is installed at the log itself (LogChannel::setBackend).
+// The platform that plug-ins use by default. The host installs it before it creates experiments, on the thread that
+// runs them. The log's back end is installed separately (LogChannel::setBackend).
 QUAZOR_EXPORT void installPlatform(Platform platform);
 QUAZOR_EXPORT const Platform& installedPlatform();
 

@@ -1,11 +1,11 @@
 // The kernel's report channels: counters that drivers publish in named groups and subgroups.
 //
-// Thread: every call is synchronous on the caller's thread and may block while the kernel is asked; sets and snapshots
-//   are immutable, and any thread may read them.
-// Ownership: objects are shared, and each keeps what it needs of those it came from.
-// Errors: a call that fails returns null and then stores the facility's own error where the caller gave a place for
-//   one; it may have none to give. Nothing is thrown.
-// Cost: filtering, sampling and subtracting are linear in the channels of the set; sets of a million channels occur.
+// Thread: every call is synchronous on the caller's thread and may block on the kernel; sets and snapshots are
+//   immutable, and any thread may read them.
+// Ownership: objects are shared, and each keeps the objects that it depends on alive.
+// Errors: a call that fails returns null and stores the facility's error if the caller passed a pointer and the
+//   facility has an error to give. Calls do not throw.
+// Cost: filtering, sampling and subtracting are linear in the number of channels; sets may have a million channels.
 #pragma once
 
 #include "contract/contract.h"
@@ -21,7 +21,7 @@
 
 namespace QUAZOR_CONTRACT {
 
-// Which channel it is. Names are exact and case-sensitive; `name` is the channel's display name.
+// The identity of a channel. Names are exact and case-sensitive; `name` is the channel's display name.
 struct ReportChannelDescription {
   std::string groupName;
   std::string subGroupName;
@@ -36,7 +36,7 @@ class ReportChannel {
       : description_(std::move(description)), count_(std::move(count)) {}
 
   const ReportChannelDescription& channelDescription() const { return *description_; }
-  // A number; nothing when the channel has no simple count.
+  // A number, or nothing if the channel has no simple count.
   const std::optional<Value>& count() const { return count_; }
 
  private:
@@ -67,7 +67,8 @@ class QUAZOR_EXPORT ReportSnapshot {
 
   // One sample per channel, in the facility's order.
   virtual const std::vector<ReportSample>& samples() const = 0;
-  // For every channel its count here minus that in `baseline`, an earlier snapshot of the set: negative for a fall.
+  // Returns, for every channel, its value here minus its value in `baseline`, an earlier snapshot of the same set:
+  // negative when the counter fell.
   virtual std::shared_ptr<const ReportSnapshot> snapshotWithBaseline(const ReportSnapshot& baseline,
                                                                      DiagnosticErrorPtr* error) const = 0;
 };
@@ -83,9 +84,9 @@ class QUAZOR_EXPORT ReportChannelSet {
   ReportChannelSet& operator=(const ReportChannelSet&) = delete;
   virtual ~ReportChannelSet();
 
-  // A new set of the channels that `keep` returns true for; this one is left as it is. Never null.
+  // Returns a new set of the channels for which `keep` returns true. Never null; this set does not change.
   virtual std::shared_ptr<const ReportChannelSet> reportByFilteringChannels(const Predicate& keep) const = 0;
-  // The values now, or null.
+  // Returns the current values, or null.
   virtual std::shared_ptr<const ReportSnapshot> snapshot(DiagnosticErrorPtr* error) const = 0;
 };
 

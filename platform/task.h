@@ -1,4 +1,4 @@
-// Task: work that is handed to a queue.
+// Task: a callable for a queue.
 #pragma once
 
 #include "contract/contract.h"
@@ -11,9 +11,9 @@
 
 namespace QUAZOR_CONTRACT {
 
-// A move-only callable without arguments or result. Callables up to kInlineSize bytes that move without throwing and
-// need no stricter alignment than a pointer are held in place, so that posting them allocates nothing; others are held
-// on the heap.
+// A move-only callable without arguments or result. Callables of at most kInlineSize bytes that have a nothrow move and
+// need no stricter alignment than a pointer are stored inline, so that posting them does not allocate; others are
+// stored on the heap.
 //
 // The callable is destroyed with the Task that holds it.
 // Thread: one at a time.
@@ -48,7 +48,7 @@ class Task {
 
   explicit operator bool() const { return operations_ != nullptr; }
 
-  // Runs the callable. REQUIRES: this Task holds one.
+  // Runs the callable. REQUIRES: this Task has one.
   void operator()() { operations_->run(storage_); }
 
   // Destroys the callable, if there is one.
