@@ -38,17 +38,17 @@ inline constexpr std::string_view kCommandNames[] = {"list",   "describe", "run"
                                                      "verify", "analyze",  "diff",  "explain",
                                                      "doctor", "selftest", "phone", "completion"};
 
-// What a command line asks for. Options that its command does not have keep their defaults.
+// A parsed command line. Options that the command does not have keep their defaults.
 struct Options {
-  std::vector<std::string> names;  // of diagnostics and experiments; what is to be explained; a shell; probe
+  std::vector<std::string> names;  // positional arguments: diagnostics or experiments, topics, a shell, "probe"
   std::vector<std::filesystem::path> plugins;  // none: the installed one
   std::vector<ParameterOverride> settings;
   std::vector<std::filesystem::path> parameterFiles;
-  std::vector<std::filesystem::path> records;  // to be read
-  std::filesystem::path record;                // to be written; empty: none
-  std::filesystem::path failedOf;              // the record that --only failed means; empty: that of the last run
+  std::vector<std::filesystem::path> records;  // to read
+  std::filesystem::path record;                // to write; empty: none
+  std::filesystem::path failedOf;              // the record for --only failed; empty: that of the last run
   std::filesystem::path profile;               // empty: the installed one
-  std::optional<Profile> recorded;             // the parameters of the run of which something is run again
+  std::optional<Profile> recorded;             // the parameters of the run that is repeated
   std::filesystem::path phone;                 // a scenario, or linux:BINDING; empty: the installed healthy one
   ReportOptions report;
   std::vector<DeadlineSetting> deadlines;
@@ -70,12 +70,11 @@ struct OptionSummary {
   bool takesValue = false;
 };
 
-// What the command of that name can be given; nothing for an unknown command.
+// The options of the command with that name; empty for an unknown command.
 std::vector<OptionSummary> optionsOfCommand(const std::string& command);
 
-// The options of a command line, or nothing when it has been answered at once: with the help or the version, on `out`,
-// and then `code` is kAllPassed, or with a refusal, on `err`, and then it is kUsage. `arguments` are without the
-// program's name.
+// Parses a command line without the program's name. Returns nothing if there is nothing to execute: after printing the
+// help or the version on `out`, with `code` kAllPassed, or an error message on `err`, with `code` kUsage.
 std::optional<Options> parseCommandLine(const std::vector<std::string>& arguments, std::ostream& out, std::ostream& err,
                                         ExitCode* code);
 

@@ -39,7 +39,7 @@ class Phone {
   virtual std::uint64_t framesDelivered() const = 0;
 };
 
-// Makes a new phone on every call, each like the first.
+// Creates a new phone on every call, all in the same initial state.
 using PhoneMaker = std::function<std::unique_ptr<Phone>()>;
 
 // Reads a scenario file and gives the maker of the phones it describes: in virtual time, or in real time when
@@ -59,22 +59,22 @@ inline constexpr std::string_view kLinuxPrefix = "linux:";
 // The FILE of "linux:FILE"; nothing for other names of phones, which are scenarios'.
 std::optional<std::filesystem::path> bindingNamed(const std::filesystem::path& phone);
 
-// Reads a binding file and gives the maker of this machine as a phone, which is always the same one, in real time.
+// Reads a binding file and returns a factory for this machine as a phone, in real time.
 // Throws a CommandError (kCannotRead) with the reader's sentence when the file cannot be read.
 PhoneMaker phonesOfBinding(const std::filesystem::path& file);
 
-// What this machine has for a binding to name: for people, line by line, and a binding to start from, a file's text.
+// The devices of this machine that a binding can use: a user-readable list, and the text of a starter binding.
 struct PhoneProbe {
   std::vector<std::string> lines;  // may hold any character that a device gives
   std::string binding;
 };
 PhoneProbe probeThisMachine();
 
-// True of the name of a process that a phone leaves behind to put its hardware in order, as a light that must not stay
-// on; it ends by itself, soon.
+// True if this is the name of a cleanup process of a phone, which restores the hardware (for example switches off a
+// projector) and soon exits.
 bool isCleanupProcess(std::string_view processName);
 
-// Where this machine keeps log lines: its journal, or syslog(3) where there is none.
+// The system log of this machine: the journal, or syslog(3) if there is no journal.
 std::shared_ptr<LogBackend> systemLogOfThisMachine();
 
 // What a scenario file says of itself. Throws a CommandError (kCannotRead) when the file cannot be read.

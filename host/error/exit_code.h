@@ -1,4 +1,4 @@
-// What quazor tells its caller by its exit code, and the exception that carries a refusal there.
+// The exit codes of quazor, and the exception for a command that cannot be executed.
 // docs/exit_codes.md is the public list.
 #pragma once
 
@@ -11,16 +11,16 @@ namespace quazor {
 // The codes from 64 on are those of the system's sysexits.h.
 enum class ExitCode : int {
   kAllPassed = 0,
-  kFailed = 1,         // a diagnostic failed its limits: the hardware's
-  kError = 2,          // a diagnostic ended in an error: not known what the hardware is like
-  kUsage = 64,         // the command line asks for what there is not
+  kFailed = 1,         // a diagnostic failed its limits: the hardware is faulty
+  kError = 2,          // a diagnostic ended in an error: the state of the hardware is unknown
+  kUsage = 64,         // the command line is invalid
   kCannotRead = 66,    // a plug-in, scenario or profile cannot be read, loaded or used
-  kInternal = 70,      // our own fault
+  kInternal = 70,      // a defect of quazor
   kCannotWrite = 73,   // the report cannot be written
   kInterrupted = 130,  // by Ctrl-C
 };
 
-// A request that is refused before anything has been touched. what() is one clear sentence for the user.
+// A command that is rejected before any device is accessed. what() is one user-readable sentence.
 //
 // Thread: any
 class CommandError : public InputError {

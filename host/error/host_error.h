@@ -1,4 +1,4 @@
-// The host's own errors, and the calls into plug-ins that they guard.
+// The host's own errors, and a wrapper for calls into plug-ins.
 #pragma once
 
 #include "contract/diagnostic_error.h"
@@ -11,18 +11,18 @@
 
 namespace quazor {
 
-// What the host itself finds wrong with a diagnostic, as opposed to what the diagnostic says of the hardware.
+// Errors that the host detects in a diagnostic, as opposed to errors that the diagnostic reports.
 inline constexpr std::string_view QuazorHostErrorDomain = "QuazorHostErrorDomain";
 
-// Codes of QuazorHostErrorDomain; they stand in reports, so a number keeps its meaning.
+// Codes of QuazorHostErrorDomain. Reports contain them, so the meaning of a number must not change.
 enum class HostErrorCode : std::int64_t {
   kNoErrorGiven = 1,     // an operation failed and gave no error
   kException = 2,        // an operation threw
   kNothingMade = 3,      // a factory returned null
-  kNothingMeasured = 4,  // the analysis succeeded without one measured result
-  kCannotBeJudged = 5,   // a measured result and its limit do not allow a judgement
-  kCrashed = 6,          // a signal ended the plug-in's process
-  kExited = 7,           // the plug-in ended its process itself
+  kNothingMeasured = 4,  // the analysis succeeded without a measured result
+  kCannotBeJudged = 5,   // a measured result cannot be compared with its limit
+  kCrashed = 6,          // a signal terminated the plug-in process
+  kExited = 7,           // the plug-in exited from its process
   kDeadline = 8,         // a stage took longer than its deadline
   kConnectionLost = 9,   // the plug-in's process closed or overwrote its connection to quazor
   kNotRecorded = 10,     // the record of the run could not be written
@@ -31,11 +31,11 @@ enum class HostErrorCode : std::int64_t {
 
 DiagnosticErrorPtr hostError(HostErrorCode code, std::string message);
 
-// The error for an exception that came out of a plug-in. `operation` names what threw.
+// The error for an exception thrown by a plug-in. `operation` is the name of the operation that threw.
 DiagnosticErrorPtr errorOfException(std::string_view operation, const std::exception_ptr& thrown);
 
-// Calls into a plug-in: `call` gets a fresh error variable and returns whether it succeeded. Whatever it throws stops
-// here. On failure `failure` becomes the error it gave, or one that says that it gave none.
+// Calls into a plug-in. `call` receives an empty error variable and returns whether it succeeded. Catches all
+// exceptions. On failure `failure` is set to the error of the call, or to kNoErrorGiven if it gave none.
 template <class Call>
 bool callPlugin(std::string_view operation, DiagnosticErrorPtr* failure, Call&& call) {
   DiagnosticErrorPtr error;

@@ -1,4 +1,4 @@
-// DiagnosticRecord: all that is known of one run of a diagnostic, or of an experiment on its own.
+// DiagnosticRecord: all data of one run of a diagnostic, or of an experiment on its own.
 #pragma once
 
 #include "contract/results.h"
@@ -16,12 +16,12 @@
 
 namespace quazor {
 
-// How long each stage took, by the phone's clock; nothing for a stage that did not take place or did not end.
+// The duration of each stage, by the phone's clock; nothing for a stage that did not take place or did not end.
 struct StageDurations {
   std::optional<std::chrono::nanoseconds> setup;
   std::optional<std::chrono::nanoseconds> run;
   std::optional<std::chrono::nanoseconds> teardown;
-  std::optional<std::chrono::nanoseconds> analysis;  // the analysis' setup and its analyzing
+  std::optional<std::chrono::nanoseconds> analysis;  // including the setup of the analysis
 };
 
 // A stage that took place, by the wall clock.
@@ -31,7 +31,7 @@ struct StagePeriod {
   std::optional<Date> end;  // nothing when it did not end
 };
 
-// Of an experiment on its own nothing is judged: it has no measured results, and kPass says that it returned a result.
+// An experiment on its own is not judged: it has no measured results, and kPass means that it returned a result.
 struct DiagnosticRecord {
   bool experimentOnly = false;
   std::string name;
@@ -44,7 +44,7 @@ struct DiagnosticRecord {
   OrderedMap<Measurement> measurements;
   Dictionary auxiliaryData;
   DiagnosticErrorPtr error;         // the first one; set exactly when the verdict is kError
-  std::optional<Stage> errorStage;  // where it came from; nothing when it is the judge's
+  std::optional<Stage> errorStage;  // the stage that failed; nothing if the results could not be judged
   std::vector<LogLine> log;
   std::vector<DeclaredFault> faults;
   std::uint64_t seed = 0;

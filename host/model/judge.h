@@ -1,4 +1,4 @@
-// The judge: from measured results and their limits, and from all that is known of a run, to a verdict. Pure functions.
+// The judge: pure functions that derive a verdict from measured results, their limits and the rest of a run.
 #pragma once
 
 #include "contract/results.h"
@@ -16,7 +16,7 @@ struct DiagnosticRecord;
 
 enum class ResultVerdict { kPass, kFail, kNone };
 
-// kFail is the hardware's; kError means that nobody knows what the hardware is like.
+// kFail means that the hardware is faulty; kError means that the state of the hardware is unknown.
 enum class Verdict { kPass, kFail, kError };
 
 std::string_view nameOf(ResultVerdict verdict);  // "pass", "fail", "none"
@@ -26,14 +26,15 @@ std::string_view nameOf(Verdict verdict);        // "pass", "fail", "error"
 struct JudgedResult {
   QZMeasuredResult result;
   ResultVerdict verdict = ResultVerdict::kNone;
-  std::string problem{};  // why the result cannot be judged; empty when it can
+  std::string problem{};  // why the result cannot be judged; empty if it can
 };
 
-// A result without a limit, or whose limit sets no bound, is for information: kNone, whatever its value.
+// A result without a limit, or with a limit without bounds, is informational: kNone, whatever its value.
 //
-// A limited result is kPass inside its bounds and kFail outside; a closed bound's own value is inside, an open one's is
-// outside. It cannot be judged, and is kFail with a problem, when its value is not finite, a bound is not finite or in
-// another unit, or no value could lie between the bounds: that is a mistake of the plug-in, not of the hardware.
+// A limited result is kPass inside its bounds and kFail outside; the value of a closed bound is inside, that of an open
+// one outside. A result cannot be judged, and is kFail with a problem, if its value is not finite, a bound is not
+// finite or has another unit, or no value can lie between the bounds. That is a defect of the plug-in, not of the
+// hardware.
 JudgedResult judgeResult(QZMeasuredResult result);
 
 struct Judgement {
@@ -42,7 +43,7 @@ struct Judgement {
   std::string problem;                       // the first problem; empty when there is none
 };
 
-// kError when nothing was measured or a result cannot be judged, else kFail when a result fails, else kPass.
+// kError if nothing was measured or a result cannot be judged; otherwise kFail if a result fails, else kPass.
 Judgement judge(const std::vector<JudgedResult>& results);
 
 struct RecordJudgement {
@@ -50,8 +51,8 @@ struct RecordJudgement {
   DiagnosticErrorPtr error;  // set exactly when the verdict is kError: the record's own, or the judge's
 };
 
-// kError when the run had an error, its plug-in's part was not completed, or its results cannot be judged; else what
-// the results say. An experiment on its own is kPass when it was completed without an error: nothing of it is judged.
+// kError if the run had an error, the plug-in's part was not completed, or the results cannot be judged; otherwise what
+// the results say. An experiment that runs alone is kPass if it was completed without an error: it is not judged.
 //
 // The verdict that the record holds does not count.
 RecordJudgement judgeRecord(const DiagnosticRecord& record, bool completed);

@@ -1,4 +1,4 @@
-// RecordBuilder: from a run's events to what is known of its diagnostics.
+// RecordBuilder: builds diagnostic records from the events of a run.
 #pragma once
 
 #include "host/model/run_event.h"
@@ -8,8 +8,8 @@
 
 namespace quazor {
 
-// Folds the events of one diagnostic after the other. Events that belong to no diagnostic, and those of a diagnostic
-// before its DiagnosticStarted, change nothing.
+// Processes the events of one diagnostic after the other. Ignores events outside of DiagnosticStarted to
+// DiagnosticEnded.
 // Thread: one at a time.
 class RecordBuilder final : public RunEventSink {
  public:
@@ -17,17 +17,17 @@ class RecordBuilder final : public RunEventSink {
 
   // True from DiagnosticStarted to DiagnosticEnded.
   bool isOpen() const { return open_; }
-  // True when the plug-in's part is over.
+  // True after DiagnosticCompleted.
   bool isCompleted() const { return completed_; }
-  // The stage that has begun last and not ended; nothing between two.
+  // The current stage; nothing between two stages.
   std::optional<Stage> stage() const;
-  // The diagnostic that began last, as far as it has come.
+  // The record, so far, of the diagnostic that started last.
   const DiagnosticRecord& record() const { return record_; }
-  // Gives the record away; a new one begins with the next diagnostic.
+  // Moves the record out. The next diagnostic starts a new one.
   DiagnosticRecord takeRecord() { return std::move(record_); }
 
-  // What closes the diagnostic: the judge's failure if it has one, then the verdict. Nothing that the events say of a
-  // verdict counts: it follows from errors, results and limits alone.
+  // The events that end the diagnostic: the failure to judge, if any, and the verdict. The verdict is derived only from
+  // errors, results and limits; verdicts in earlier events are ignored.
   std::vector<RunEvent> ending(Date date) const;
 
  private:

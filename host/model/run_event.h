@@ -1,4 +1,4 @@
-// RunEvent: what a run tells while it goes on. Every report and record is made from these events alone.
+// RunEvent: an event of a run. All reports and records are derived from these events.
 #pragma once
 
 #include "contract/results.h"
@@ -14,16 +14,16 @@
 
 namespace quazor {
 
-// The first event: what is run, with what, on what.
+// The first event: the diagnostics, plug-ins and phone of the run.
 struct RunStarted {
   std::string program;  // the version of quazor
   int contract = 0;     // the version of the plug-in contract
   Date date{};
   std::vector<std::string> plugins;  // files
-  std::string phone;                 // what it was made from
+  std::string phone;                 // its scenario or binding
   std::uint64_t seed = 0;
-  bool ofExperiments = false;      // of experiments on their own
-  std::vector<std::string> names;  // of what is to be run
+  bool ofExperiments = false;      // true for experiments on their own
+  std::vector<std::string> names;  // of the diagnostics or experiments to run
 };
 
 struct DiagnosticStarted {
@@ -44,7 +44,7 @@ struct StageStarted {
 
 struct StageEnded {
   Stage stage;
-  std::optional<std::chrono::nanoseconds> duration;  // by the phone's clock, where one ran
+  std::optional<std::chrono::nanoseconds> duration;  // by the phone's clock, if a phone was running
   Date date{};
 };
 
@@ -52,7 +52,7 @@ struct Logged {
   LogLine line;
 };
 
-// Some of the measurements of the experiment's result, in its order.
+// Some of the measurements of the experiment's result, in their order.
 struct MeasurementsAdded {
   std::vector<std::pair<std::string, Measurement>> measurements;
 };
@@ -63,7 +63,7 @@ struct AuxiliaryDataAdded {
   Value value;
 };
 
-// Some of the analysis' measured results, in its order.
+// Some of the measured results of the analysis, in their order.
 struct ResultsReported {
   std::vector<QZMeasuredResult> results;
 };
@@ -78,7 +78,7 @@ struct FaultsCounted {
   std::vector<DeclaredFault> faults;
 };
 
-// The plug-in's part is over: whatever follows is the host's.
+// The plug-in has finished; only the host sends further events of this diagnostic.
 struct DiagnosticCompleted {};
 
 struct DiagnosticEnded {
@@ -87,7 +87,7 @@ struct DiagnosticEnded {
 };
 
 struct RunEnded {
-  std::optional<std::string> interrupted;  // what was running when the run was interrupted; empty between two
+  std::optional<std::string> interrupted;  // the diagnostic that was running at the interruption; empty if none was
   Date date{};
 };
 
@@ -95,7 +95,7 @@ using RunEvent =
     std::variant<RunStarted, DiagnosticStarted, StageStarted, StageEnded, Logged, MeasurementsAdded, AuxiliaryDataAdded,
                  ResultsReported, Failed, FaultsCounted, DiagnosticCompleted, DiagnosticEnded, RunEnded>;
 
-// Takes a run's events, in their order.
+// Receives the events of a run, in order.
 // Thread: one at a time.
 class RunEventSink {
  public:

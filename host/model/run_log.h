@@ -18,22 +18,22 @@ class RunEventSink;
 std::string_view nameOf(LogLevel level);  // "error", "default", "debug"
 
 struct LogLine {
-  std::chrono::nanoseconds time{};  // since the run began, by the phone's clock
+  std::chrono::nanoseconds time{};  // since the start of the run, by the phone's clock
   LogLevel level = LogLevel::kDefault;
   std::string text;
   Date date{};  // by the wall clock
 };
 
-// Tells every line as an event, until it is closed.
+// Sends every log line as an event until it is closed.
 // Thread: any.
 class RunLog final : public LogBackend {
  public:
-  // The run begins now. `events` is borrowed until close(), and gets one line at a time.
+  // Starts the run's time. `events` is borrowed until close() and receives one line at a time.
   RunLog(std::shared_ptr<const Clock> clock, RunEventSink& events);
 
   void write(LogLevel level, std::string_view subsystem, std::string_view category, std::string_view text) override;
 
-  // What is written later is dropped.
+  // Lines written after this are dropped.
   void close();
 
  private:

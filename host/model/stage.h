@@ -6,8 +6,8 @@
 
 namespace quazor {
 
-// In the order in which they take place. kLoad is the loading of plug-ins, kDescribe the making of the experiment and
-// the asking for its description, kAnalyze all that is done with the analysis.
+// In execution order. kLoad loads the plug-ins, kDescribe creates the experiment and asks for its description, and
+// kAnalyze includes all operations of the analysis.
 enum class Stage { kLoad, kDescribe, kSetup, kRun, kTeardown, kAnalyze };
 
 inline constexpr Stage kStages[] = {Stage::kLoad, Stage::kDescribe, Stage::kSetup,
@@ -15,7 +15,7 @@ inline constexpr Stage kStages[] = {Stage::kLoad, Stage::kDescribe, Stage::kSetu
 
 std::string_view nameOf(Stage stage);  // "load", "describe", "setup", "run", "teardown", "analyze"
 
-// The stage of that name; also kAnalyze for "analyse", its name in earlier records and command lines.
+// The stage with that name, or nothing. "analyse" is kAnalyze: earlier records and command lines have it.
 std::optional<Stage> stageNamed(std::string_view name);
 
 }  // namespace quazor

@@ -1,4 +1,4 @@
-// The diagnostics and experiments that the loaded plug-ins offer.
+// The diagnostics and experiments of the loaded plug-ins.
 #pragma once
 
 #include "contract/lab.h"
@@ -10,8 +10,8 @@
 
 namespace quazor {
 
-// A diagnostic with the factories of its two halves; or an experiment on its own, whose two names are one and which has
-// neither summary nor analysis.
+// A diagnostic with the factories of its experiment and analysis, or an experiment on its own, which has no summary
+// and no analysis and whose `name` equals `experimentName`.
 struct Diagnostic {
   std::string name;
   std::string summary;
@@ -20,51 +20,51 @@ struct Diagnostic {
   QZExperimentFactory makeExperiment;
   QZAnalysisFactory makeAnalysis;
   bool experimentOnly = false;
-  std::vector<std::string> usedBy{};  // of an experiment on its own: the diagnostics that have it, as registered
-  // The files that register it and its halves, in the order of their loading; empty where it is not known.
+  std::vector<std::string> usedBy{};  // for an experiment on its own: the diagnostics that use it
+  // The files that register the diagnostic, its experiment and its analysis, in loading order; empty if unknown.
   std::vector<std::filesystem::path> plugins{};
 };
 
-// What a diagnostic's halves say of themselves.
+// The descriptions of a diagnostic's experiment and analysis.
 struct DiagnosticDescription {
   QZDescription experiment{""};
   QZDescription analysis{""};
-  DiagnosticErrorPtr error;  // why it could not be asked; null when it could
-  bool isAsked = true;       // false: nobody wanted it, and the rest is empty
+  DiagnosticErrorPtr error;  // why there is no description; null if there is one
+  bool isAsked = true;       // false if no description was requested; all other members are then empty
 };
 
-// What a command's names can stand for. Of the experiments that diagnostics use, kDescribable has those that are asked
-// for by name, or by a pattern that fits nothing else: the diagnostics' descriptions have them already.
+// What the names of a command refer to. kDescribable includes the experiments of diagnostics only if they are requested
+// by name or by a pattern that matches nothing else, because the descriptions of the diagnostics already contain them.
 enum class Wanted { kDiagnostics, kExperiments, kDescribable };
 
-// The lab's diagnostics, then all its experiments, each in the order of their registration. A diagnostic of which a
-// half is not registered is left out.
+// The lab's diagnostics followed by all its experiments, each in registration order. Omits a diagnostic whose
+// experiment or analysis is not registered.
 std::vector<Diagnostic> catalogueOf(const QZLab& lab);
 
-// Makes an experiment and, of a diagnostic, an analysis to ask for their descriptions, on a platform without a phone.
-// What a plug-in throws ends in `error`.
+// Creates the experiment and, for a diagnostic, the analysis, and asks for their descriptions, on a platform without a
+// phone. An exception of the plug-in is stored in `error`.
 DiagnosticDescription describeDiagnostic(const Diagnostic& diagnostic);
 
-// As describeDiagnostic for what is among `wanted`; nothing else is asked.
+// Like describeDiagnostic if `wanted` contains the diagnostic; otherwise asks for nothing.
 DiagnosticDescription describeIfWanted(const Diagnostic& diagnostic, const std::vector<Diagnostic>& wanted);
 
-// What there is of the catalogue for everyone who asks for all.
+// The entries selected by --all.
 std::vector<Diagnostic> allOf(const std::vector<Diagnostic>& catalogue, Wanted wanted);
 
-// What `names` ask for, without repetitions, in the order of the names; a name that nothing wanted has is a pattern of
-// the shell's kind (*, ?, [...]) and stands for all that match, in the catalogue's order. Throws a CommandError
-// (kUsage) for a name or pattern that fits nothing wanted; it tells the command to use when there is something else of
-// that name.
+// The entries selected by `names`, without duplicates, in the order of the names. A name that matches no wanted entry
+// exactly is a shell pattern (*, ?, [...]) and selects all matching entries, in registry order. Throws a CommandError
+// (kUsage) if a name or pattern matches no wanted entry; the message names the right command if an entry of another
+// kind has that name.
 std::vector<Diagnostic> selectDiagnostics(const std::vector<Diagnostic>& catalogue, Wanted wanted,
                                           const std::vector<std::string>& names);
 
-// True when `diagnostics` has that one: the diagnostic, or the experiment on its own, of its name.
+// True if `diagnostics` contains that diagnostic, or that experiment on its own, by name.
 bool contains(const std::vector<Diagnostic>& diagnostics, const Diagnostic& wanted);
 
-// True when `pattern` is, or matches, `name`.
+// True if `pattern` equals or matches `name`.
 bool matchesName(const std::string& pattern, const std::string& name);
 
-// True when the text has a character that is special in patterns.
+// True if the text contains a special character of patterns.
 bool isPattern(const std::string& text);
 
 std::vector<std::string> namesOf(const std::vector<Diagnostic>& diagnostics);

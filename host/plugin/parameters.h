@@ -1,4 +1,4 @@
-// From settings and profile to the parameter values of one run, checked against what the diagnostics declare.
+// Resolves settings and profiles to the parameter values of a run, and checks them against the declared parameters.
 #pragma once
 
 #include "contract/results.h"
@@ -13,13 +13,13 @@
 
 namespace quazor {
 
-// Where a setting stands.
+// The source of a setting.
 enum class OverridePlace { kEnvironment, kCommandLine };
 
-// The variable of the environment with settings, separated by white space.
+// The environment variable with settings, separated by white space.
 inline constexpr const char* kSettingsVariable = "QUAZOR_SET";
 
-// What one setting says: [experiment.|analysis.]NAME=VALUE.
+// One setting: [experiment.|analysis.]NAME=VALUE.
 struct ParameterOverride {
   std::string text;          // as it was written
   std::optional<Part> half;  // nothing: wherever the parameter is declared
@@ -28,10 +28,10 @@ struct ParameterOverride {
   OverridePlace place = OverridePlace::kCommandLine;
 };
 
-// Throws a CommandError (kUsage) for a text that is not of that form or whose value is no finite number.
+// Throws a CommandError (kUsage) if the text does not have that form or the value is not a finite number.
 ParameterOverride parseOverride(const std::string& text, OverridePlace place = OverridePlace::kCommandLine);
 
-// The settings of the environment. Throws as parseOverride.
+// The settings in the environment. Throws like parseOverride.
 std::vector<ParameterOverride> overridesOfEnvironment();
 
 // A declared parameter and its value for a run.
@@ -39,7 +39,7 @@ struct ResolvedParameter {
   std::string name;
   QZNumberParameter declaration;
   std::optional<Value> value;  // nothing: not set
-  std::string source;          // where the value comes from, for people; empty when not set
+  std::string source;          // user-readable source of the value; empty if not set
 };
 
 struct ResolvedParameters {
@@ -51,10 +51,10 @@ struct ResolvedParameters {
   }
 };
 
-// The values that are set, as setups take them.
+// The values that are set, in the form that a setup receives.
 Dictionary dictionaryOf(const std::vector<ResolvedParameter>& parameters);
 
-// A diagnostic and what it declares.
+// A diagnostic and its description.
 struct DescribedDiagnostic {
   Diagnostic diagnostic;
   DiagnosticDescription description;
@@ -65,32 +65,32 @@ struct DescribedDiagnostic {
   }
 };
 
-// Throws a CommandError (kCannotRead) for a profile's parameter that no diagnostic or experiment of its entry declares
-// and, unless the profile may name others, for an entry that fits none. An entry for something that was not described,
-// or could not be, is passed over.
+// Throws a CommandError (kCannotRead) if an entry of the profile sets a parameter that no matching diagnostic or
+// experiment declares or, unless the profile may name others, if an entry matches none. Skips an entry if anything that
+// it matches was not described.
 void checkProfile(const Profile& profile, const std::vector<DescribedDiagnostic>& catalogue);
 
-// What was not described, and might declare a parameter that an entry of the profile sets, while nothing described that
-// the entry fits declares it: before it is described, checkProfile cannot tell whether the entry is wrong.
+// The undescribed diagnostics that must be described before checkProfile can check an entry: those that match an entry
+// with a parameter that no described match declares.
 std::vector<Diagnostic> diagnosticsToDescribe(const Profile& profile,
                                               const std::vector<DescribedDiagnostic>& catalogue);
 
-// Throws a CommandError (kUsage) for a setting whose parameter none of the selected declares, and for two settings of
-// one parameter in one place.
+// Throws a CommandError (kUsage) if no selected diagnostic declares the parameter of a setting, or if one source sets
+// the same parameter twice.
 void checkOverrides(const std::vector<ParameterOverride>& settings, const std::vector<DescribedDiagnostic>& selected);
 
-// The parameters of one diagnostic or experiment. The last that has a value for a parameter wins: the profiles in their
-// order, then the environment's settings, then the command line's.
+// The parameters of one diagnostic or experiment. Later sources override earlier ones: the profiles in order, the
+// environment, the command line.
 ResolvedParameters resolveParameters(const DescribedDiagnostic& diagnostic, const std::vector<Profile>& profiles,
                                      const std::vector<ParameterOverride>& settings);
 
-// A diagnostic with the values its parameters would have in a run.
+// A diagnostic with the parameter values for a run.
 struct ResolvedDiagnostic {
   DescribedDiagnostic described;
   ResolvedParameters parameters;
 };
 
-// Throws a CommandError (kUsage) when a required parameter has no value.
+// Throws a CommandError (kUsage) if a required parameter has no value.
 void requireParameters(const DescribedDiagnostic& diagnostic, const ResolvedParameters& parameters);
 
 }  // namespace quazor

@@ -1,4 +1,4 @@
-// Loading plug-ins into the process.
+// Loads plug-ins into the process.
 #pragma once
 
 #include "contract/lab.h"
@@ -18,21 +18,19 @@ struct LoadedPlugin {
   std::size_t last;  // the position after its last registration, among the lab's
 };
 
-// Loads the plug-ins in order; each registers with the process-wide lab. A file that is named twice is loaded once.
-// Plug-ins stay loaded until the process ends, as the lab holds their factories. Returns those that were loaded.
+// Loads the plug-ins in order; each registers with the process-wide lab. A file that is listed twice is loaded once.
+// Plug-ins stay loaded until the process ends, because the lab holds their factories. Returns the loaded plug-ins.
 //
-// Throws a CommandError (kCannotRead) when a file cannot be loaded, was built against another version of the contract,
-// registers nothing or a name that is taken, or when a diagnostic names an experiment or analysis that, after all
-// plug-ins have been loaded, nobody has registered. `isNext`, unless it is empty, is told of each file before it is
-// loaded.
+// Throws a CommandError (kCannotRead) if a file cannot be loaded, was built against another version of the contract,
+// registers nothing or a name already in use, or if a diagnostic names an experiment or analysis that is still not
+// registered after all plug-ins have been loaded. `isNext`, if not empty, is called with each file before it is loaded.
 std::vector<LoadedPlugin> loadPlugins(const std::vector<std::filesystem::path>& files,
                                       const std::function<void(const std::filesystem::path& file)>& isNext = nullptr);
 
-// As loadPlugins, of some of the plug-ins that belong together: a diagnostic may name what none of them registers.
+// Like loadPlugins, but for a subset of the plug-ins: a diagnostic may name something that none of them registers.
 void loadSomePlugins(const std::vector<std::filesystem::path>& files);
 
-// The contract version of the symbol that a dynamic linker's message complains of; nothing when it is about something
-// else.
+// The contract version of the missing symbol in a dynamic linker's message; nothing if the message has another cause.
 std::optional<int> contractVersionIn(std::string_view linkerMessage);
 
 }  // namespace quazor

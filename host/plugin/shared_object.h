@@ -1,15 +1,15 @@
-// Looking at a file before the dynamic linker does.
+// Checks a file before it is passed to the dynamic linker.
 #pragma once
 
 #include <filesystem>
 
 namespace quazor {
 
-// Throws InputError when `file` cannot be a shared object; what() is the end of a sentence that begins with its name.
-// The dynamic linker maps what a file's headers promise and crashes the process where a truncated file has no more
-// bytes, so the promises are checked here. What the linker refuses cleanly is left to it.
+// Throws InputError if `file` is not a shared object; what() is the end of a sentence that begins with the file's name.
+// The dynamic linker trusts the sizes in a file's headers and crashes the process on a truncated file, so this function
+// checks them. All other checks are left to the linker.
 //
-// Source of the layout: elf(5).
+// The layout is described in elf(5).
 void validateSharedObject(const std::filesystem::path& file);
 
 }  // namespace quazor

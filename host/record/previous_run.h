@@ -1,4 +1,4 @@
-// The record that is kept of the last run, for those who did not ask for one.
+// The record of the last run, which is kept automatically.
 #pragma once
 
 #include "host/record/record_file.h"
@@ -13,8 +13,7 @@ namespace quazor {
 // when the environment tells neither.
 std::filesystem::path previousRunFile();
 
-// The names of what did not pass, or did not come to its end, in their order; what was to be run and was not is among
-// them.
+// The names, in order, of the diagnostics that did not pass, did not finish, or were selected but never started.
 std::vector<std::string> failedNames(const RecordedRun& run);
 
 }  // namespace quazor

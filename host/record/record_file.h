@@ -1,4 +1,4 @@
-// Records: files with all events of a run, one a line. docs/record_format.md is the public description.
+// Records: files with all events of a run, one per line. docs/record_format.md is the public description.
 #pragma once
 
 #include "host/model/run_event.h"
@@ -10,30 +10,29 @@
 
 namespace quazor {
 
-// The version of the form of records.
+// The version of the record format.
 inline constexpr int kRecordFormat = 1;
 
-// The line of a record that holds the event, with the line's end. `sequence` is the number of events before it.
+// Returns the record line of the event, including the line end. `sequence` is the number of events before it.
 std::string recordLine(const RunEvent& event, std::uint64_t sequence);
 
-// Writes a record while the run goes on. A line is handed to the system as a whole before onEvent() returns, so that
-// what has been taken is in the file whatever happens to this process, and a file that was cut off ends in a line
-// without an end.
+// Writes a record during a run. onEvent() writes each line with one system call before it returns, so the file contains
+// all events so far even if this process is killed, and only the last line of the file can be incomplete.
 // Thread: one at a time.
 class RecordWriter final : public RunEventSink {
  public:
-  // A new file takes the place of one of that name at once. Throws a CommandError (kCannotWrite) when it cannot be
-  // made.
+  // Creates the file, replacing an existing one atomically. Throws a CommandError (kCannotWrite) if it cannot be
+  // created.
   explicit RecordWriter(std::filesystem::path file);
   ~RecordWriter() override;
 
   // After a failure nothing more is written.
   void onEvent(const RunEvent& event) override { onEvent(event, recordLine(event, taken_)); }
-  // The same for who has the line already: it is the event's in all records of one run.
+  // Writes a line that was already formatted. The line of an event is the same in all records of a run.
   void onEvent(const RunEvent& event, const std::string& line);
 
   const std::filesystem::path& file() const { return file_; }
-  // Why something could not be written; the empty text when all was.
+  // Why writing failed; empty if everything was written.
   const std::string& problem() const { return problem_; }
 
  private:
@@ -45,16 +44,16 @@ class RecordWriter final : public RunEventSink {
   std::string problem_;
 };
 
-// What a file holds.
+// The content of a record file.
 struct StoredRecord {
   std::vector<RunEvent> events;
-  bool cutOff = false;  // its last line has no end, and is not among the events
+  bool cutOff = false;  // the last line is incomplete and not included in the events
 };
 
 // Throws a CommandError (kCannotRead) that names file and line when the file cannot be read or is no record.
 StoredRecord readRecord(const std::filesystem::path& file);
 
-// The diagnostics of a record that it does not hold to the end have the verdict kError.
+// The run stored in a record. Incomplete diagnostics have the verdict kError.
 struct RecordedRun {
   RunStarted began;
   std::vector<DiagnosticRecord> records;

@@ -1,4 +1,4 @@
-// Verifying a record: do the verdicts that it holds follow from the rest of it?
+// Verifies that the verdicts in a record follow from its data.
 #pragma once
 
 #include "host/model/run_event.h"
@@ -8,9 +8,9 @@
 
 namespace quazor {
 
-// What is wrong with the events of a record, one sentence each; none when every verdict and every failure of quazor's
-// own follow from errors, results and limits, the events stand in the order in which runs tell them, and a run that
-// came to its end ran all that it was to run. A run that was cut off is not wrong.
+// Returns the problems in the events of a record, one sentence each. There are none if every verdict and every error of
+// quazor follows from errors, results and limits, the events are in a valid order, and a finished run includes all
+// selected diagnostics. A run that was cut off is not a problem.
 std::vector<std::string> problemsOf(const std::vector<RunEvent>& events);
 
 }  // namespace quazor

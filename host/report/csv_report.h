@@ -9,15 +9,14 @@
 
 namespace quazor {
 
-// One field as RFC 4180 has it: in quotes, and quotes in it doubled, when it has a comma, a quote or a line's end in
-// it.
+// Formats one field according to RFC 4180: a field with a comma, a quote or a line end is quoted, and its quotes are
+// doubled.
 std::string csvField(std::string_view text);
 
-// A header line, then a line for each sample of each image and a line for each measurement, in the order of the
-// records.
+// A header line, then one line per sample of each image and one per measurement, in the order of the records.
 std::string experimentCsv(const std::vector<DiagnosticRecord>& records);
 
-// A header line, then a line for each measured result, and one for each diagnostic without any.
+// A header line, then one line per measured result. A diagnostic without results has one line.
 std::string diagnosticCsv(const std::vector<DiagnosticRecord>& records);
 
 }  // namespace quazor

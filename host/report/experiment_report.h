@@ -1,4 +1,4 @@
-// The report for people, of experiments that run on their own.
+// The text report of experiments that run on their own.
 #pragma once
 
 #include "contract/value.h"
@@ -9,21 +9,21 @@
 
 namespace quazor {
 
-// How text may look where it goes.
+// The capabilities of the output.
 struct TextStyle {
   bool colour = false;
-  bool blocks = false;  // it takes UTF-8 text, and block elements in it
+  bool blocks = false;  // supports UTF-8 and block elements
 };
 
-// Auxiliary data, indented by two spaces and, unless names or texts are longer, within 80 columns. Images
-// (sample_images.h) have a line of what they hold beside samples, then a picture of each list of 8 to 64 samples with
-// its lowest and highest one; of longer lists only these two are told.
+// Prints auxiliary data, indented by two spaces and within 80 columns unless a name or text is longer. For an image
+// (sample_images.h) it prints a line with the values other than samples, then a picture of each list of 8 to 64 samples
+// with its minimum and maximum. For longer lists it prints only the minimum and maximum.
 void printAuxiliaryData(std::ostream& out, const Dictionary& data, bool blocks);
 
-// What one experiment measured as a table, its auxiliary data, then how it ended and, with kError, the error.
+// Prints the measurements of one experiment as a table, its auxiliary data, its outcome and, for kError, the error.
 void printExperiment(std::ostream& out, const DiagnosticRecord& record, TextStyle style);
 
-// How many returned a result and how many did not, in one line.
+// Prints one line with the number of experiments that returned a result and that did not.
 void printExperimentSummary(std::ostream& out, const std::vector<DiagnosticRecord>& records);
 
 }  // namespace quazor

@@ -22,7 +22,7 @@ nlohmann::ordered_json experimentJson(const DiagnosticRecord& record);
 nlohmann::ordered_json runDocument(const std::vector<DiagnosticRecord>& records,
                                    const std::optional<std::string>& interrupted);
 
-// The same for a run of experiments on their own.
+// Like runDocument, for a run of experiments on their own.
 nlohmann::ordered_json experimentDocument(const std::vector<DiagnosticRecord>& records,
                                           const std::optional<std::string>& interrupted);
 

@@ -1,4 +1,4 @@
-// The report as JUnit's XML, which servers of continuous integration read. docs/junit_output.md is the public
+// The report in the JUnit XML format, which continuous integration servers read. docs/junit_output.md is the public
 // description.
 #pragma once
 
@@ -10,11 +10,11 @@
 
 namespace quazor {
 
-// One test suite for each record, then one for what was interrupted without a record and for each that was never run.
-// `interrupted` is that of RunEnded.
+// One test suite per record, then one for an interrupted diagnostic without a record and one per diagnostic that never
+// ran. `interrupted` as in RunEnded.
 //
-// In a suite an error counts more than a failure, and a failure more than a pass; one that has neither an error nor a
-// failure has passed, unless all it has was skipped.
+// A suite with an error has the verdict error; otherwise a suite with a failure has failed. Any other suite has passed
+// unless its test case was skipped.
 std::string junitReport(const RunStarted& run, const std::vector<DiagnosticRecord>& records,
                         const std::optional<std::string>& interrupted);
 

@@ -1,4 +1,4 @@
-// JUnitSuite: one test suite of JUnit's XML.
+// JUnitSuite: one test suite in JUnit XML.
 #pragma once
 
 #include "contract/diagnostic_error.h"
@@ -12,13 +12,13 @@
 
 namespace quazor {
 
-// Names and values, in the order of their adding.
+// Names and values, in insertion order.
 // Thread: one at a time.
 class JUnitProperties {
  public:
   void add(const std::string& name, const std::string& value);
 
-  // The element, each line of it behind `indent`; nothing when there are none.
+  // The XML element with each line indented by `indent`; empty if there are no properties.
   std::string xml(const std::string& indent) const;
 
  private:
@@ -36,7 +36,7 @@ struct JUnitCounts {
   JUnitCounts& operator+=(const JUnitCounts& other);
 };
 
-// `<ELEMENT name="..." tests="..." ...>`: a suite's tag, or that of all suites.
+// `<ELEMENT name="..." tests="..." ...>`: the start tag of one suite or of all suites.
 std::string junitTag(const std::string& element, const std::string& name, const JUnitCounts& counts, Date begin);
 
 // Thread: one at a time.
@@ -48,7 +48,7 @@ class JUnitSuite {
 
   void addPass(const std::string& name, const JUnitProperties& properties);
   void addFailure(const std::string& name, const JUnitProperties& properties, const std::string& message);
-  // With the errors that caused it, a line each.
+  // Includes the underlying errors, one per line.
   void addError(const std::string& name, const JUnitProperties& properties, const DiagnosticErrorPtr& error);
   void addSkipped(const std::string& name, const std::string& message);
   void addLog(const std::vector<LogLine>& lines);
@@ -57,7 +57,7 @@ class JUnitSuite {
   std::string xml() const;
 
  private:
-  // `outcome` is an element; empty for a pass.
+  // `outcome` is an XML element; empty for a pass.
   void addCase(const std::string& name, const JUnitProperties& properties, const std::string& outcome);
 
   std::string name_;

@@ -1,5 +1,5 @@
 // The report in the output format of Open Compute Test & Validation, version 2.0: JSON lines. The format is described
-// by the project opencomputeproject/ocp-diag-core; docs/ocp_output.md tells what becomes what.
+// by the project opencomputeproject/ocp-diag-core; docs/ocp_output.md describes the mapping.
 #pragma once
 
 #include "host/model/run_event.h"
@@ -10,8 +10,8 @@
 
 namespace quazor {
 
-// One test run for each record, each with sequence numbers of its own, one after the other; then one for what was
-// interrupted without a record and for each that was never run. `interrupted` is that of RunEnded.
+// One test run per record, each with its own sequence numbers, then one for an interrupted diagnostic without a record
+// and one per diagnostic that never ran. `interrupted` as in RunEnded.
 std::string ocpReport(const RunStarted& run, const std::vector<DiagnosticRecord>& records,
                       const std::optional<std::string>& interrupted);
 

@@ -12,18 +12,17 @@
 
 namespace quazor {
 
-// Numbers the lines and dates them: each is as late as it says, and never earlier than the line before it.
+// Numbers the lines and adds their time stamps. A line is never dated earlier than the previous one.
 // Thread: one at a time.
 class OcpStream {
  public:
-  // Begins with the format's version. `out` and `log` are borrowed; lines are appended to `out`. The log's lines go out
-  // in their order, each before the first artifact that is later, and belong to the run: what its steps were doing then
-  // is told by the place alone.
+  // Writes the format's version first. `out` and `log` are borrowed; lines are appended to `out`. Log lines are merged
+  // in order of time and belong to the run rather than to a step.
   OcpStream(std::string& out, const std::vector<LogLine>& log, Date begin);
 
   void addToRun(const char* key, nlohmann::ordered_json artifact, Date date);
   void addToStep(const char* step, const char* key, nlohmann::ordered_json artifact, Date date);
-  // Writes what is left of the log, and the end of the run.
+  // Writes the remaining log lines and the end of the run.
   void end(const char* status, const char* result, Date date);
 
   // The date of the last line.
@@ -36,8 +35,8 @@ class OcpStream {
 
   std::string& out_;
   const std::vector<LogLine>& log_;
-  std::size_t logged_ = 0;  // lines of the log that are written
-  std::size_t number_ = 0;  // of the next line
+  std::size_t logged_ = 0;  // the number of log lines written
+  std::size_t number_ = 0;  // the sequence number of the next line
   Date last_;
 };
 

@@ -1,4 +1,4 @@
-// The progress line: what is running, for how long, and how many frames have come.
+// The progress line: the running diagnostic, the elapsed time and the number of frames.
 #pragma once
 
 #include "host/plugin/parameters.h"
@@ -12,7 +12,7 @@
 
 namespace quazor {
 
-// What a run is expected to come to; nothing where its parameters do not say.
+// The expected duration and number of frames of a run; nothing if its parameters do not determine them.
 struct ExpectedProgress {
   std::optional<double> seconds;        // the experiment's parameter "duration", else its "timeout", if above zero
   std::optional<std::uint64_t> frames;  // the experiment's parameter "frameCount", if 1 or more
@@ -20,11 +20,11 @@ struct ExpectedProgress {
 
 ExpectedProgress expectedProgressOf(const ResolvedParameters& parameters);
 
-// "Running NAME: 1.2 s of 3 s, 36 of 90 frames", without what is not expected or not known.
+// "Running NAME: 1.2 s of 3 s, 36 of 90 frames", without the parts that are unknown.
 std::string progressText(const std::string& name, double elapsedSeconds, const ExpectedProgress& expected,
                          std::optional<std::uint64_t> frames);
 
-// One line of a terminal about what is running, from 0.3 seconds after its beginning on; erased at the end.
+// Shows the progress in one terminal line, starting 0.3 seconds after the start of a run and erased at its end.
 //
 // Thread: one at a time.
 class Progress {
@@ -38,13 +38,13 @@ class Progress {
   bool isShown() const { return terminal_ != nullptr; }
   // REQUIRES: nothing is running.
   void start(const std::string& name, const ExpectedProgress& expected);
-  // Where the number of frames that have come is asked for, until stop(). Does nothing when nothing is running.
+  // Sets the function that returns the number of frames, until stop(). Does nothing if nothing is running.
   void countFrames(std::function<std::uint64_t()> count);
-  // Brings the line up to date; to be called now and then, as often as one likes.
+  // Updates the line. Call it periodically, at any interval.
   void update();
-  // Erases the line. Does nothing when nothing is running.
+  // Erases the line. Does nothing if nothing is running.
   void stop();
-  // Erases the line and calls `write`, which may write to the terminal; the line comes back with its next change.
+  // Erases the line and calls `write`, which may write to the terminal. The next update shows the line again.
   void aside(const std::function<void()>& write);
 
  private:

@@ -1,4 +1,4 @@
-// What two records tell differently.
+// The differences between two records.
 #pragma once
 
 #include "host/record/record_file.h"
@@ -8,8 +8,8 @@
 
 namespace quazor {
 
-// One sentence per difference, "NAME: ...", first by the order of `before`. Of diagnostics that both have: verdict,
-// parameters, error, the results by name with value, unit, limit and verdict, and the measurements.
+// One sentence per difference, "NAME: ...", in the order of `before` first. Diagnostics in both records are compared by
+// verdict, parameters, error, results (by name, with value, unit, limit and verdict) and measurements.
 std::vector<std::string> differencesOf(const RecordedRun& before, const RecordedRun& after);
 
 }  // namespace quazor

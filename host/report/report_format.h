@@ -1,4 +1,4 @@
-// The forms of reports.
+// The report formats.
 #pragma once
 
 #include "host/model/run_event.h"
@@ -17,10 +17,10 @@ inline constexpr Format kFormats[] = {Format::kText, Format::kJson, Format::kCsv
 
 std::string_view nameOf(Format format);  // "text", "json", "csv", "ocp", "junit"
 
-// The format of that name.
+// The format with that name, or nothing.
 std::optional<Format> formatNamed(std::string_view name);
 
-// A report that was asked for.
+// A requested report.
 struct OutputRequest {
   Format format = Format::kText;
   std::filesystem::path file;
@@ -30,14 +30,14 @@ struct OutputRequest {
 // format.
 OutputRequest parseOutput(const std::string& text, Format usual);
 
-// The whole report of a run. `interrupted` is that of RunEnded.
+// The complete report of a run. `interrupted` as in RunEnded.
 std::string reportText(Format format, const RunStarted& run, const std::vector<DiagnosticRecord>& records,
                        const std::optional<std::string>& interrupted);
 
-// One record in the form for people.
+// Prints the text report of one record.
 void printReport(std::ostream& out, const DiagnosticRecord& record, bool colour, bool blocks);
 
-// How many there were of each verdict, in one line.
+// Prints one line with the number of records per verdict.
 void printCounts(std::ostream& out, const std::vector<DiagnosticRecord>& records, bool ofExperiments);
 
 }  // namespace quazor

@@ -1,4 +1,4 @@
-// RunReport: what a run of diagnostics or experiments prints and writes, as it goes and at its end.
+// RunReport: prints and writes the reports of a run, during the run and at its end.
 #pragma once
 
 #include "contract/log_channel.h"
@@ -15,25 +15,25 @@
 
 namespace quazor {
 
-// Where the program writes. The streams are borrowed.
+// The output streams of the program, borrowed.
 struct Console {
   std::ostream& out;
   std::ostream& err;
-  bool colour = false;         // on `out`
-  bool showsProgress = false;  // on `err`: it is a terminal
-  bool blocks = false;         // text may be UTF-8, with block elements in it
+  bool colour = false;         // `out` supports colour
+  bool showsProgress = false;  // `err` is a terminal
+  bool blocks = false;         // `out` supports UTF-8 and block elements
 };
 
 struct ReportOptions {
   Format format = Format::kText;
-  // Where the report in that format goes; empty for the console.
+  // The destination of the report in that format; empty for the console.
   std::filesystem::path output;
-  std::vector<OutputRequest> outputs{};  // further reports
+  std::vector<OutputRequest> outputs{};  // additional reports
   LogLevel shownLog = LogLevel::kError;  // lines up to this level go to the console's error stream
 };
 
-// The text report goes out diagnostic by diagnostic, every other one at the end. With an output file the report goes
-// there at the end, and the console gets one line a diagnostic.
+// The text report is printed after each diagnostic, all other formats at the end of the run. If the report goes to a
+// file, it is written at the end and the console shows one line per diagnostic.
 //
 // Thread: one at a time.
 class RunReport final : public RunEventSink {
@@ -45,7 +45,7 @@ class RunReport final : public RunEventSink {
   // Hands over the record of the diagnostic that has ended.
   void addRecord(DiagnosticRecord record);
 
-  // What the run came to, once it has ended: kCannotWrite when not all reports could be written.
+  // The exit code after the end of the run; kCannotWrite if a report could not be written.
   ExitCode exitCode() const;
 
   Progress& progress() { return progress_; }
@@ -62,7 +62,7 @@ class RunReport final : public RunEventSink {
   bool allWritten_ = true;
 };
 
-// The exit code for the verdicts: an error wins over a failure.
+// The exit code for the verdicts. An error takes precedence over a failure.
 ExitCode exitCodeOf(const std::vector<DiagnosticRecord>& records);
 
 }  // namespace quazor

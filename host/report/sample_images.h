@@ -1,4 +1,4 @@
-// Images of samples in auxiliary data, told by the shape of the data alone: a dictionary that holds lists of numbers.
+// Finds images of samples in auxiliary data by their shape: dictionaries that contain lists of numbers.
 #pragma once
 
 #include "contract/value.h"
@@ -7,14 +7,14 @@
 
 namespace quazor {
 
-// True for a list of numbers that is not empty.
+// True for a non-empty list of numbers.
 bool isSamples(const Value& value);
 
 // True for a dictionary with samples in at least one entry.
 bool isImage(const Value& value);
 
-// The images that an entry of auxiliary data is: itself, or the elements of a list of nothing but images. Empty when it
-// is neither. The pointers are valid as long as `value` is.
+// The images in an entry of auxiliary data: the entry itself, or the elements of a list that contains only images.
+// Empty if it is neither. The pointers are valid as long as `value` is.
 std::vector<const Dictionary*> imagesIn(const Value& value);
 
 }  // namespace quazor

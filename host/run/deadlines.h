@@ -1,4 +1,4 @@
-// How long each stage of a diagnostic may take before it is ended from outside.
+// The time limit of each stage of a diagnostic.
 #pragma once
 
 #include "host/model/stage.h"
@@ -11,20 +11,20 @@
 
 namespace quazor {
 
-// What one --deadline says: [STAGE=]SECONDS.
+// One --deadline option: [STAGE=]SECONDS.
 struct DeadlineSetting {
   std::optional<Stage> stage;  // nothing: every stage
   std::chrono::nanoseconds time{};
 };
 
-// Throws a CommandError (kUsage) for a text that is not of that form, or whose time is not above zero.
+// Throws a CommandError (kUsage) if the text does not have that form or the time is not greater than zero.
 DeadlineSetting parseDeadline(const std::string& text);
 
 // Thread: any; it is immutable.
 class Deadlines {
  public:
-  // Those of a diagnostic with these parameters: where nothing is set, a run may take a minute more than twice the
-  // seconds that its parameters tell (its "duration", else its "timeout"), every other stage a minute.
+  // The deadlines of a diagnostic with these parameters. By default, the run may take twice the parameter "duration"
+  // (or else "timeout") plus one minute, and every other stage one minute.
   Deadlines(const ResolvedParameters& parameters, const std::vector<DeadlineSetting>& settings);
 
   std::chrono::nanoseconds of(Stage stage) const { return times_[static_cast<std::size_t>(stage)]; }

@@ -1,4 +1,4 @@
-// The way of a run's events: to the records, then to the report.
+// Passes the events of a run to the records and then to the report.
 #pragma once
 
 #include "host/model/record_builder.h"
@@ -16,7 +16,7 @@
 
 namespace quazor {
 
-// Where a run's events go.
+// The destinations of a run's events.
 struct EventPipelineOptions {
   std::filesystem::path record;  // empty: none
   bool keepsLastRun = false;
@@ -24,22 +24,22 @@ struct EventPipelineOptions {
   ReportOptions report;
 };
 
-// What the user is told has been recorded before.
+// Every event is recorded before it is shown to the user.
 //
 // Thread: any; it handles one event at a time.
 class EventPipeline final : public RunEventSink {
  public:
-  // Begins the records that were asked for. Throws a CommandError (kCannotWrite) for a record that cannot be begun.
+  // Creates the requested records. Throws a CommandError (kCannotWrite) if one cannot be created.
   // `console` is borrowed.
   EventPipeline(const EventPipelineOptions& options, Console& console);
 
   void onEvent(const RunEvent& event) override;
 
-  // Closes the diagnostic that is open, by what is known of it.
+  // Ends the current diagnostic with the verdict that follows from its events.
   void endDiagnostic();
-  // Closes the run, and the diagnostic that is open if there is one, as interrupted, and then calls `leave` while
-  // nothing else happens. Does nothing but that after the run's end. When an event does not end its way in time, as
-  // when it is written to a pipe that nobody reads, `leave` is called all the same.
+  // Ends the run and the current diagnostic, if any, as interrupted, and then calls `leave` while no other event is
+  // processed. After the end of the run it only calls `leave`. If another event is stuck, for example in a pipe that is
+  // not read, `leave` is called after a timeout.
   void interruptAndLeave(const std::function<void()>& leave);
 
   ExitCode exitCode() const { return report_.exitCode(); }
@@ -51,7 +51,7 @@ class EventPipeline final : public RunEventSink {
   void interruptRun();
 
   std::vector<std::unique_ptr<RecordWriter>> records_;
-  std::size_t required_ = 0;  // so many of them, from the first, were asked for
+  std::size_t required_ = 0;  // the number of records that the user requested; they come first
   std::uint64_t recorded_ = 0;
   std::shared_ptr<LogBackend> systemLog_;
   RecordBuilder builder_;

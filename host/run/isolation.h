@@ -1,4 +1,4 @@
-// Running plug-ins in processes of their own.
+// Runs plug-ins in separate processes.
 #pragma once
 
 #include "host/model/run_event.h"
@@ -25,37 +25,37 @@ struct IsolationOptions {
   std::vector<DeadlineSetting> deadlines;
 };
 
-// A plug-in that could not be loaded because its process did not survive it.
+// A plug-in that could not be loaded because loading it ended the process.
 struct FailedPlugin {
   std::filesystem::path file;
   DiagnosticErrorPtr error;
 };
 
-// Without the plug-ins that failed, which would end every process that loads them.
+// Returns the options without the failed plug-ins, which would end every process that loads them.
 IsolationOptions withoutFailed(IsolationOptions options, const std::vector<FailedPlugin>& failed);
 
-// What the plug-ins have, without their factories, and those of them that could not be loaded.
+// The diagnostics of the plug-ins, without factories, and the plug-ins that could not be loaded.
 struct PluginScan {
   std::vector<DescribedDiagnostic> catalogue;
   std::vector<FailedPlugin> failed;
   bool interrupted = false;
 };
 
-// Chooses from a catalogue.
+// Selects diagnostics from a registry.
 using DiagnosticChoice = std::function<std::vector<Diagnostic>(const std::vector<Diagnostic>& catalogue)>;
 
-// Loads the plug-ins in a process of their own and asks what is in them; only what `described` chooses is asked for its
-// description. A plug-in that ends its process while it is loaded is left out and told in `failed`; what
-// ends its process while it is described has that as its description's error. Throws the Refusals of loadPlugins and of
-// `described`, which is called in that process.
+// Loads the plug-ins in a separate process and lists their diagnostics. Only those selected by `described` are asked
+// for their descriptions. A plug-in that ends the process while it is loaded is listed in `failed`; if a description
+// ends the process, that is the error of the description. Throws the CommandErrors of loadPlugins and of `described`,
+// which is called in the separate process.
 PluginScan scanPlugins(const IsolationOptions& options, WatchedSignals& signals, const DiagnosticChoice& described);
 
-// As runDiagnostic, in a process of its own, which loads the plug-ins that the diagnostic needs, and no others where
-// they are known. Whatever ends that process before its time becomes a Failed event of the stage it was in, and there
-// is no DiagnosticCompleted then. What it writes to its standard output and error stream become log lines. False when
-// the user interrupted it.
+// Like runDiagnostic, but in a separate process, which loads only the plug-ins that the diagnostic needs, if they are
+// known. If the process ends early, a Failed event for the current stage gives the reason, and DiagnosticCompleted is
+// missing. Standard output and standard error of the process become log lines. Returns false if the user interrupted
+// the run.
 //
-// `result`, if it is not null, is analyzed, and no experiment is run.
+// If `result` is not null, it is analyzed instead of running an experiment.
 bool runIsolated(const IsolationOptions& options, WatchedSignals& signals, const Diagnostic& diagnostic,
                  const ResolvedParameters& parameters, const RunOptions& runOptions, const QZExperimentResult* result,
                  Progress& progress, RunEventSink& events);

@@ -1,4 +1,4 @@
-// ChildProcess: a process of quazor's own in which a plug-in's code runs, so that whatever it does ends with it.
+// ChildProcess: a child process in which plug-in code runs, isolated from quazor.
 #pragma once
 
 #include <cstdint>
@@ -22,25 +22,25 @@ struct ProcessEnd {
 // "exit code 3", "signal 11 (SIGSEGV)".
 std::string textOf(const ProcessEnd& end);
 
-// The signals of a process that watches others: its children's ends, and what asks itself to end. While it lives, none
-// of SIGINT, SIGTERM, SIGHUP and SIGCHLD acts by itself, but for one that the process was started to ignore.
+// The signals of a supervising process: the end of its children, and requests to end. While this object lives, SIGINT,
+// SIGTERM, SIGHUP and SIGCHLD are delivered through it, except those that the process was started to ignore.
 //
 // Thread: the one that made it, and no other thread may be there.
 class WatchedSignals {
  public:
-  // Throws std::system_error when the system refuses what it needs.
+  // Throws std::system_error if a system call fails.
   WatchedSignals();
   WatchedSignals(const WatchedSignals&) = delete;
   WatchedSignals& operator=(const WatchedSignals&) = delete;
   ~WatchedSignals();
 
-  // Readable when a signal has come.
+  // Readable when a signal is pending.
   int descriptor() const { return descriptor_; }
-  // Takes what has come.
+  // Reads the pending signals.
   void drain();
-  // How often the process was asked to end; SIGINT and SIGTERM count, and SIGHUP.
+  // The number of requests to end: SIGINT, SIGTERM and SIGHUP.
   int requestsToEnd() const { return requestsToEnd_; }
-  // For a new child: makes signals act as they did.
+  // Restores the original signal handling in a new child.
   void restore() const;
 
  private:
@@ -50,8 +50,8 @@ class WatchedSignals {
   int requestsToEnd_ = 0;
 };
 
-// A child in a process group of its own. It sees none of this process's descriptors but its connection; its standard
-// input is empty, its standard output and error stream go to outputDescriptor().
+// A child in its own process group. It inherits only the descriptor of its connection; its standard input is empty, and
+// its standard output and standard error go to outputDescriptor().
 //
 // Thread: the one that made it, and no other thread may be there when it is made.
 class ChildProcess {
@@ -59,15 +59,14 @@ class ChildProcess {
   // The name of a process (proc(5), /proc/PID/comm) that restores the hardware after a child, and is given time for it.
   using IsCleanupProcess = bool (*)(std::string_view name);
 
-  // Calls `body` in the child, with the descriptor of its end of the connection, and ends the child when it returns;
-  // what it throws ends the child by SIGABRT.
-  // `memory` limits the child's address space, in bytes; nothing leaves it as it is. Throws std::system_error when the
-  // system refuses a process.
+  // Calls `body` in the child with the descriptor of its end of the connection. The child exits when `body` returns, or
+  // aborts with SIGABRT if it throws. `memory` limits the child's address space in bytes; nothing means no new limit.
+  // Throws std::system_error if the process cannot be created.
   ChildProcess(const WatchedSignals& signals, const std::function<void(int connection)>& body,
                std::optional<std::uint64_t> memory, IsCleanupProcess isCleanupProcess = nullptr);
   ChildProcess(const ChildProcess&) = delete;
   ChildProcess& operator=(const ChildProcess&) = delete;
-  // Ends the child, its group and whatever of its descendants is left, and waits for that, but not for ever.
+  // Kills the child, its group and its remaining descendants, and waits for them with a timeout.
   ~ChildProcess();
 
   pid_t id() const { return id_; }
@@ -75,10 +74,10 @@ class ChildProcess {
   int connectionDescriptor() const { return connection_; }
   int outputDescriptor() const { return output_; }
 
-  // How the child ended, once it has. Does not wait.
+  // How the child ended, or nothing if it has not. Does not block.
   const std::optional<ProcessEnd>& end();
 
-  // Sends the signal to the child and its whole group, and lets them go on if they were stopped.
+  // Sends the signal to the child and its whole group, and continues them if they were stopped.
   void signalGroup(int signal) const;
 
  private:
@@ -87,7 +86,7 @@ class ChildProcess {
   int connection_ = -1;
   int output_ = -1;
   std::optional<ProcessEnd> end_;
-  std::vector<pid_t> others_;  // children of this process that were there before
+  std::vector<pid_t> others_;  // children that this process already had
 };
 
 }  // namespace quazor

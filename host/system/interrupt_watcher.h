@@ -1,4 +1,4 @@
-// InterruptWatcher: Ctrl-C while diagnostics run.
+// InterruptWatcher: handles Ctrl-C while diagnostics run.
 #pragma once
 
 #include <functional>
@@ -8,13 +8,12 @@
 
 namespace quazor {
 
-// While it lives, an interrupt from the keyboard (SIGINT) no longer ends the process but calls `interrupted`, once, on
-// a thread of its own. Threads that start meanwhile inherit that. Where the process was started with interrupts
-// ignored, they stay ignored.
+// While this object lives, SIGINT does not end the process but calls `interrupted` once, on a separate thread. Threads
+// started in the meantime inherit this. If the process was started with SIGINT ignored, it stays ignored.
 // Thread: one at a time; `interrupted` is called on the watcher's own thread.
 class InterruptWatcher {
  public:
-  // Throws std::system_error when the system refuses what it needs.
+  // Throws std::system_error if a system call fails.
   explicit InterruptWatcher(std::function<void()> interrupted);
   InterruptWatcher(const InterruptWatcher&) = delete;
   InterruptWatcher& operator=(const InterruptWatcher&) = delete;

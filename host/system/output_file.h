@@ -1,4 +1,4 @@
-// Writing a report to a file.
+// Writes reports to files.
 #pragma once
 
 #include <filesystem>
@@ -6,15 +6,14 @@
 
 namespace quazor {
 
-// Makes `text` the content of `file`, at once: it is written to a new file beside it, which then takes its place, so
-// that a reader sees the old content or the new one and a failure leaves the old. Links are followed, and the
-// permissions of a file that is replaced are kept. What is no regular file, such as a pipe or a device, is written to
-// as it is.
+// Replaces the content of `file` by `text` atomically: writes a new file in the same directory and renames it, so that
+// a reader sees either the old or the new content, and a failure leaves the old. Follows links and keeps the
+// permissions of a replaced file. Writes directly to anything that is not a regular file, such as a pipe or a device.
 //
 // Throws a CommandError (kCannotWrite) that names the file and the reason.
 void writeOutputFile(const std::filesystem::path& file, std::string_view text);
 
-// Throws the error that writeOutputFile() would, as far as that shows without writing.
+// Throws the same error as writeOutputFile() if it can be detected without writing.
 void validateOutputFile(const std::filesystem::path& file);
 
 }  // namespace quazor

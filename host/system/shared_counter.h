@@ -1,4 +1,4 @@
-// SharedCounter: a number that a process and the children it makes later both see.
+// SharedCounter: a number shared by a process and the children that it creates later.
 #pragma once
 
 #include <atomic>
@@ -9,7 +9,7 @@ namespace quazor {
 // Thread: any, of any of the processes.
 class SharedCounter {
  public:
-  // Throws std::system_error when the system refuses the memory.
+  // Throws std::system_error if the memory cannot be mapped.
   SharedCounter();
   SharedCounter(const SharedCounter&) = delete;
   SharedCounter& operator=(const SharedCounter&) = delete;

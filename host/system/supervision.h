@@ -1,4 +1,4 @@
-// Watching over a child process: what it says, how long it takes, how it ends.
+// Supervises a child process: its output, its deadline and its end.
 #pragma once
 
 #include "host/system/child_process.h"
@@ -12,20 +12,20 @@
 
 namespace quazor {
 
-// The longest line of the connection, in octets; a few more may come.
+// The maximum line length on the connection, in bytes; a line may exceed it by a few bytes.
 inline constexpr std::size_t kMaxEvent = std::size_t{64} << 20U;
 
-// What is to be done with what a child says. All are called on the watching thread.
+// The callbacks for a child's output. All are called on the supervising thread.
 struct Supervision {
   using Moment = std::chrono::steady_clock::time_point;
 
-  // Takes a line of the connection, without its end; false when it is none that the child should write.
+  // Handles a line of the connection, without its line end. Returns false if the line is not valid.
   std::function<bool(std::string_view line)> takeLine;
-  // Takes a line of the child's standard output or error stream.
+  // Handles a line of the child's standard output or standard error.
   std::function<void(std::string_view line)> takeOutput;
-  // When the child is to be ended, unless it says something before; asked again after whatever it says.
+  // The time at which to end the child. Called again after each line from the child.
   std::function<Moment()> deadline;
-  // True when the child has said all it has to say: it is only waited for.
+  // True if no more output is expected and only the end of the child is awaited.
   std::function<bool()> isDone;
   // Called about ten times a second; may be empty.
   std::function<void()> tick;
@@ -35,17 +35,17 @@ enum class SupervisionEnd {
   kEnded,           // the child ended by itself
   kDeadline,        // it was ended at the deadline
   kInterrupted,     // it was ended because this process was asked to end
-  kConnectionLost,  // it was ended because it had closed the connection, or had written what is no line of it
-  kLineTooLong,     // it was ended because it had written a line of more than kMaxEvent octets to it
+  kConnectionLost,  // it was ended because it closed the connection or wrote an invalid line to it
+  kLineTooLong,     // it was ended because it wrote a line of more than kMaxEvent bytes
 };
 
 struct Supervised {
   SupervisionEnd how = SupervisionEnd::kEnded;
-  std::optional<ProcessEnd> end;  // nothing when it did not end in spite of everything
+  std::optional<ProcessEnd> end;  // nothing if the child could not be killed
 };
 
-// Watches over the child until it has ended. A child that is to be ended gets SIGTERM and, half a second later,
-// SIGKILL, with its whole process group; a second request to end leaves the half second out.
+// Supervises the child until it has ended. To end it, sends SIGTERM to its process group and, half a second later,
+// SIGKILL. A second request to end skips the half second.
 Supervised supervise(ChildProcess& child, WatchedSignals& signals, const Supervision& supervision);
 
 }  // namespace quazor
