@@ -57,8 +57,8 @@ class ParametersTest(CommandLineTest):
 
     def test_what_is_refused_of_files(self):
         rows = [
-            (self.directory / "missing.json", "there is no such file."),
-            (self.write("empty.json", ""), "this is not JSON"),
+            (self.directory / "missing.json", "the file does not exist."),
+            (self.write("empty.json", ""), "not valid JSON"),
             (self.directory, "this is a directory, not a file."),
             (self.profile("typo.json", measurd=1), "did you mean 'measured'?"),
             (self.write("other.json", '{"schema": 1, "diagnostics": {"Fake.Oen": {}}}'), "matches no diagnostic"),
@@ -111,7 +111,7 @@ class ProcessTest(CommandLineTest):
         self.assertEqual(result.returncode, 0, result.stdout)
 
     def test_deadlines_that_are_refused(self):
-        for text, problem in {"": "a number is missing", "0": "above zero", "-1": "above zero", "soon": "not a number",
+        for text, problem in {"": "a number is missing", "0": "greater than zero", "-1": "greater than zero", "soon": "not a number",
                               "nan": "not a finite number", "runn=1": "unknown stage 'runn'",
                               "run=": "a number is missing"}.items():
             with self.subTest(text):
@@ -247,7 +247,7 @@ class InterruptTest(CommandLineTest):
                         "--format", "json")
         out, err = process.communicate(timeout=30)
         self.assertEqual(process.returncode, 130, err)
-        self.assertIn("interrupted between two diagnostics", err)
+        self.assertIn("interrupted while no diagnostic was running", err)
         document = json.loads(out)
         self.assertEqual((len(document["diagnostics"]), document["interrupted"]), (1, ""))
         self.assertEqual(events_in(self.record)[-1]["interrupted"], "")

@@ -128,7 +128,7 @@ class VerifyTest(RecordTest):
             with self.subTest(change.__name__):
                 result = quazor("verify", self.changed(change))
                 self.assertEqual(result.returncode, 1, result.stdout)
-                self.assertTrue(result.stdout.startswith("WRONG  Fake.One has the "), result.stdout)
+                self.assertTrue(result.stdout.startswith("WRONG  Fake.One: the recorded "), result.stdout)
 
     def test_what_is_no_record_is_refused(self):
         def missing_line(events):
@@ -371,7 +371,7 @@ class OnlyFailedTest(RecordTest):
         self.assertEqual(result.returncode, 2, result.stderr)
         for option in (["--seed", "3"], ["--realtime"]):
             result = quazor("run", "--only", "failed", *option, env=self.state)
-            self.assert_refused(result, 64, "for simulated phones; that run's was 'linux:")
+            self.assert_refused(result, 64, "only to simulated phones, but that run used 'linux:")
         self.assertEqual(quazor("run", "--only", "failed", env=self.state).returncode, 2)
 
     def test_what_was_not_begun_runs_with_the_installed_profile(self):
@@ -417,8 +417,8 @@ class OnlyFailedTest(RecordTest):
         self.assert_refused(self.only_failed(), 66, "the plug-in fatal_plugin.so could not be loaded in that run")
         self.assert_refused(self.only_failed("--of", self.directory / "missing"), 66, "missing' cannot be read")
         self.assert_refused(self.only_failed("--of", self.phone), 66, "contains no events")
-        self.assert_refused(self.only_failed("--all"), 64, "without names and without --all")
-        self.assert_refused(self.run_fake("--only", "failed"), 64, "without names and without --all")
+        self.assert_refused(self.only_failed("--all"), 64, "cannot be combined with names or --all")
+        self.assert_refused(self.run_fake("--only", "failed"), 64, "cannot be combined with names or --all")
         self.assert_refused(self.run_fake("--of", self.phone), 64, "--of requires --only failed")
         self.assert_refused(self.run_fake("--only", "faild", names=[]), 64, "--only: faild not in {failed}")
 
