@@ -1,5 +1,7 @@
 #include "backends/faults/fault_reader.h"
 
+#include "base/text/input_error.h"
+
 #include <gmock/gmock.h>
 #include <gtest/gtest.h>
 

@@ -378,23 +378,20 @@ TEST_F(BindingTest, RefusesCountersThatCannotBe) {
 }
 
 TEST_F(BindingTest, ReadsFaultsOfWhatItBinds) {
-  std::string problem;
-  const std::optional<Binding> binding = read(R"({"title": "t",
+  const Binding binding = read(R"({"title": "t",
     "cameras": {"BackFacingCamera": {"node": {"card": "c"}, "size": {"width": 1, "height": 1}}},
     "groups": {"back": {"cameras": ["BackFacingCamera"], "master": "BackFacingCamera"}},
     "faults": [
       {"operation": "CaptureStream.start", "object": "BackFacingCamera", "occurrence": 2, "action": "hang"},
       {"operation": "SynchronizedStreamsGroup.streams", "object": "back", "action": "nothing"},
       {"operation": "HidDevice.setFeatureReportWithID", "object": "Any Sensor", "property": "0xAB", "action": "fail"},
-      {"operation": "RegistryService.registryProperty", "property": "Power", "action": "delay", "seconds": 0.5}]})",
-                                              &problem);
-  ASSERT_TRUE(binding) << problem;
-  ASSERT_EQ(binding->faults.size(), 4U);
-  EXPECT_EQ(binding->faults[0],
+      {"operation": "RegistryService.registryProperty", "property": "Power", "action": "delay", "seconds": 0.5}]})");
+  ASSERT_EQ(binding.faults.size(), 4U);
+  EXPECT_EQ(binding.faults[0],
             (Fault{"CaptureStream.start", "BackFacingCamera", std::nullopt, 2, FaultAction::kHang, std::nullopt, 0}));
-  EXPECT_EQ(binding->faults[1].object, "back");
-  EXPECT_EQ(binding->faults[2].object, "Any Sensor");
-  EXPECT_EQ(binding->faults[3].seconds, 0.5);
+  EXPECT_EQ(binding.faults[1].object, "back");
+  EXPECT_EQ(binding.faults[2].object, "Any Sensor");
+  EXPECT_EQ(binding.faults[3].seconds, 0.5);
 }
 
 TEST_F(BindingTest, RefusesFaultsThatCannotBe) {

@@ -53,7 +53,7 @@ class SimulatedHidUnderTest {
  private:
   std::optional<SimulatedPhone> phone_;
   const std::shared_ptr<CallInterceptor> calls_ =
-      std::make_shared<CallInterceptor>(std::vector<Fault>{}, nullptr, CallInterceptor::Hang{});
+      std::make_shared<CallInterceptor>(std::vector<Fault>{}, nullptr, nullptr, nullptr);
   std::shared_ptr<HidService> hid_;
 };
 
