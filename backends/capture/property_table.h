@@ -1,4 +1,5 @@
-// Which properties the objects of a capture service have, and what its operations are called.
+// What can be called on a capture service, and which properties its objects have: the vocabulary of the service's own
+// checks, of scenario files and of faults.
 #pragma once
 
 #include "platform/capture_keys.h"

@@ -23,6 +23,9 @@
 namespace quazor {
 namespace {
 
+// Cannot fail, so faults do not reach it; observers do.
+constexpr std::string_view kClockSleep = "Clock.sleep";
+
 // The phone's clock as plug-ins have it: their sleeps are calls that observers see.
 class ObservedClock final : public Clock {
  public:
@@ -96,7 +99,7 @@ void SimulatedPhone::build(const Scenario& scenario, const std::shared_ptr<Clock
                            CallInterceptor::Hang hang) {
   calls_ = std::make_shared<CallInterceptor>(scenario.faults, clock, std::move(hang), simulatedInjectedError);
   hardware_ = std::make_shared<CaptureHardware>(scenario, clock, concurrency);
-  platform_.capture = std::make_shared<SimulatedCaptureService>(hardware_, calls_);
+  platform_.capture = makeSimulatedCapture(scenario, hardware_, calls_);
   platform_.reports = interceptReports(makeSimulatedReports(scenario.reports, hardware_), calls_);
   platform_.hid = std::make_shared<SimulatedHidService>(scenario.hidDevices, clock, *concurrency, calls_);
   platform_.framebuffer = std::make_shared<SimulatedFramebufferService>(scenario.display, calls_);
@@ -130,7 +133,7 @@ std::uint64_t SimulatedPhone::deliverFrames(std::string_view camera, std::uint64
     if (state == hardware_->cameras.end()) {
       throw std::invalid_argument("The phone has no camera " + std::string(camera) + ".");
     }
-    delivery = state->delivery;
+    if (state->running != nullptr) delivery = state->running->delivery;
   }
   return delivery == nullptr ? 0 : delivery->push(count);
 }

@@ -1,11 +1,12 @@
 #include "backends/linux/capture/camera_device.h"
 
-#include "backends/linux/capture/camera_checks.h"
+#include "backends/linux/system/linux_error.h"
 #include "platform/capture_keys.h"
 
 #include <cmath>
 #include <string>
 #include <string_view>
+#include <tuple>
 #include <utility>
 
 namespace quazor {
@@ -19,23 +20,19 @@ std::shared_ptr<V4l2Device> openMatching(const std::shared_ptr<V4l2Api>& kernel,
   return node ? V4l2Device::open(kernel, node->path.string(), error) : nullptr;
 }
 
+CameraInfo infoOf(const CameraBinding& binding) {
+  CameraInfo info;
+  info.name = binding.port;
+  info.port = binding.port;
+  info.description = "stream of " + binding.port;
+  info.hasProjector = binding.projector.has_value();
+  return info;
+}
+
+// Below it no interval can be told to a driver.
+constexpr double kMinRate = 0.01;
+
 }  // namespace
-
-Value CameraSettings::darkness() {
-  Dictionary dark;
-  for (const std::string_view key :
-       {capture_key::Mode, capture_key::StructuredLightPattern, capture_key::StructuredLightCurrent}) {
-    dark.set(key, 0);
-  }
-  return dark;
-}
-
-std::shared_ptr<PixelBufferHandler> CameraSettings::frameHandler() const {
-  if (!toBoolean(entryOf(&outputsEnabled, capture_key::PrimaryScaler))) return nullptr;
-  const Value* const handlers = entryOf(&outputHandlers, capture_key::PrimaryScaler);
-  const Value* const handler = entryOf(handlers, capture_key::PixelBufferHandler);
-  return handler == nullptr ? nullptr : std::dynamic_pointer_cast<PixelBufferHandler>(handler->object());
-}
 
 FrameInterval intervalFor(double framesPerSecond) {
   const double whole = std::round(framesPerSecond);
@@ -43,25 +40,25 @@ FrameInterval intervalFor(double framesPerSecond) {
   return {1000, static_cast<std::uint32_t>(std::lround(framesPerSecond * 1000))};
 }
 
-bool LinuxCamera::open(const std::shared_ptr<V4l2Api>& kernel, const std::vector<V4l2DeviceInfo>& nodes,
-                       DiagnosticErrorPtr* error) {
-  settings_ = CameraSettings();
+LinuxCamera::LinuxCamera(CameraBinding binding, std::shared_ptr<LinuxCameras> cameras)
+    : binding_(std::move(binding)), info_(infoOf(binding_)), cameras_(std::move(cameras)) {}
+
+bool LinuxCamera::open(CameraSettings& settings, DiagnosticErrorPtr* error) {
+  const auto& [kernel, nodes] = std::tie(cameras_->kernel, cameras_->nodes);
   node_ = openMatching(kernel, nodes, VideoNodeKind::kCamera, binding_.node, port(), error);
   if (node_ != nullptr && binding_.metadata.node) {
     metadataNode_ = openMatching(kernel, nodes, VideoNodeKind::kMetadata, *binding_.metadata.node, port(), error);
     if (metadataNode_ == nullptr) node_.reset();
   }
   const bool opened = node_ != nullptr && prepare(error);
+  if (opened) settings.autoExposure = exposesAutomatically();
   if (!opened) close();
   return opened;
 }
 
 bool LinuxCamera::prepare(DiagnosticErrorPtr* error) {
-  const bool prepared = node_->lockExclusive(error) &&
-                        (!binding_.projector || node_->set(binding_.projector->off, error)) &&
-                        node_->set(binding_.controls, error);
-  if (prepared) settings_.autoExposure = exposesAutomatically();
-  return prepared;
+  return node_->lockExclusive(error) && (!binding_.projector || node_->set(binding_.projector->off, error)) &&
+         node_->set(binding_.controls, error);
 }
 
 bool LinuxCamera::exposesAutomatically() const {
@@ -75,28 +72,25 @@ void LinuxCamera::close() {
   metadataNode_.reset();
 }
 
-bool LinuxCamera::setFormatIndex(const Value& index, DiagnosticErrorPtr* error) {
-  if (!applyFormat(index, error)) return false;
-  settings_.formatIndex = index;
-  return true;
+bool LinuxCamera::applyFormat(const CameraSettings& wanted, DiagnosticErrorPtr* error) {
+  const auto index = static_cast<std::uint32_t>(toUnsigned(&wanted.formatIndex));
+  return node_->setFormat(index, binding_.width, binding_.height, error);
 }
 
-bool LinuxCamera::applyFormat(const Value& index, DiagnosticErrorPtr* error) {
-  return node_->setFormat(static_cast<std::uint32_t>(toUnsigned(&index)), binding_.width, binding_.height, error);
+bool LinuxCamera::applyRates(const CameraSettings& wanted, DiagnosticErrorPtr* error) {
+  for (const std::optional<Value>& rate : {wanted.minimumRate, wanted.maximumRate}) {
+    if (!rate || toDouble(&*rate) >= kMinRate) continue;
+    return refuseLinux(error, LinuxErrorCode::kBadValue, "%@: no driver takes less than %@ frames per second.", port(),
+                       kMinRate);
+  }
+  const bool agree =
+      wanted.minimumRate && wanted.maximumRate && toDouble(&*wanted.minimumRate) <= toDouble(&*wanted.maximumRate);
+  return !agree || intervalOf(wanted, error);
 }
 
-bool LinuxCamera::setRates(const std::optional<Value>& minimum, const std::optional<Value>& maximum,
-                           DiagnosticErrorPtr* error) {
-  const bool agree = minimum && maximum && toDouble(&*minimum) <= toDouble(&*maximum);
-  if (agree && !applyRates(minimum, maximum, error)) return false;
-  settings_.minimumRate = minimum;
-  settings_.maximumRate = maximum;
-  return true;
-}
-
-// Without any rate, the driver keeps its own, which it may be unable to tell.
-std::optional<FrameInterval> LinuxCamera::applyRates(const std::optional<Value>& minimum,
-                                                     const std::optional<Value>& maximum, DiagnosticErrorPtr* error) {
+// Sets what the rates ask for. Without any rate, the driver keeps its own, which it may be unable to tell.
+std::optional<FrameInterval> LinuxCamera::intervalOf(const CameraSettings& settings, DiagnosticErrorPtr* error) {
+  const auto& [minimum, maximum] = std::tie(settings.minimumRate, settings.maximumRate);
   if (!minimum && !maximum) return node_->interval(nullptr).value_or(FrameInterval());
   const double lowest = toDouble(pointerTo(minimum));
   const double highest = maximum ? toDouble(&*maximum) : HUGE_VAL;
@@ -113,9 +107,10 @@ std::optional<FrameInterval> LinuxCamera::applyRates(const std::optional<Value>&
   return std::nullopt;
 }
 
-bool LinuxCamera::setAutoExposure(const Value& enabled, DiagnosticErrorPtr* error) {
+bool LinuxCamera::applyAutoExposure(const CameraSettings& wanted, DiagnosticErrorPtr* error) {
+  const bool isAutomatic = *wanted.autoExposure.boolean();
   const VideoControl* const control = node_->controlOfId(V4L2_CID_EXPOSURE_AUTO);
-  if (control == nullptr && *enabled.boolean()) {
+  if (control == nullptr && isAutomatic) {
     return refuseLinux(error, LinuxErrorCode::kNotSupported, "%@: %@ has no automatic exposure.", port(),
                        node_->path());
   }
@@ -124,18 +119,13 @@ bool LinuxCamera::setAutoExposure(const Value& enabled, DiagnosticErrorPtr* erro
     constexpr std::int64_t kManual = V4L2_EXPOSURE_MANUAL;
     constexpr std::int64_t kAutomatic = V4L2_EXPOSURE_AUTO;
     const std::int64_t automatic = control->usual == kManual ? kAutomatic : control->usual;
-    if (!node_->set(*control, *enabled.boolean() ? automatic : kManual, error)) return false;
+    return node_->set(*control, isAutomatic ? automatic : kManual, error);
   }
-  settings_.autoExposure = enabled;
   return true;
 }
 
-bool LinuxCamera::setLightSource(const Value& configuration, DiagnosticErrorPtr* error) {
-  if (!binding_.projector) {
-    return refuseLinux(error, LinuxErrorCode::kNotSupported, "%@ has no projector, so no %@.", port(),
-                       capture_key::InfraredLightSourceConfiguration);
-  }
-  for (const ControlSetting& setting : lightOf(configuration)) {
+bool LinuxCamera::checkLightSource(const CameraSettings& wanted, DiagnosticErrorPtr* error) {
+  for (const ControlSetting& setting : lightOf(wanted.lightSource)) {
     const VideoControl* const control = node_->control(setting.control, error);
     if (control == nullptr) return false;
     if (!takes(*control, setting.value)) {
@@ -143,7 +133,6 @@ bool LinuxCamera::setLightSource(const Value& configuration, DiagnosticErrorPtr*
                          control->name, control->lowest, control->highest, setting.value);
     }
   }
-  settings_.lightSource = configuration;
   return true;
 }
 
@@ -162,18 +151,30 @@ std::vector<ControlSetting> LinuxCamera::lightOf(const Value& configuration) con
   return settings;
 }
 
-std::shared_ptr<CameraRun> LinuxCamera::begin(std::shared_ptr<DeliveredFrames> delivered, DiagnosticErrorPtr* error) {
-  if (!applyFormat(settings_.formatIndex, error)) return nullptr;
-  const std::optional<FrameInterval> interval = applyRates(settings_.minimumRate, settings_.maximumRate, error);
+std::optional<Dictionary> LinuxCamera::errorCounters(const CaptureRun* run, DiagnosticErrorPtr* error) const {
+  if (run == nullptr) return errorCountersOf(binding_.errorCounters);
+  return static_cast<const CameraRun*>(run)->errorCounters(error);
+}
+
+std::optional<SessionCount> LinuxCamera::sessionCount(const CaptureRun* run, const CaptureRun& master) const {
+  const auto& first = static_cast<const CameraRun&>(master);
+  const FrameCounts counts = run == nullptr ? FrameCounts() : static_cast<const CameraRun*>(run)->counts();
+  const std::int64_t frames = counts.frames == 0 ? -1 : static_cast<std::int64_t>(counts.frames);
+  return SessionCount{frameOffset(counts, first.counts(), first.interval()), frames};
+}
+
+std::shared_ptr<CameraRun> LinuxCamera::begin(const CameraSettings& settings, DiagnosticErrorPtr* error) {
+  if (!applyFormat(settings, error)) return nullptr;
+  const std::optional<FrameInterval> interval = intervalOf(settings, error);
   if (!interval) return nullptr;
   CameraRunPlan plan;
   plan.camera = binding_;
   plan.interval = *interval;
-  plan.handler = settings_.frameHandler();
-  plan.light = lightOf(settings_.lightSource);
+  plan.handler = settings.frameHandler();
+  plan.light = lightOf(settings.lightSource);
   plan.node = node_;
   plan.metadataNode = metadataNode_;
-  auto begun = std::make_shared<CameraRun>(std::move(plan), std::move(delivered));
+  auto begun = std::make_shared<CameraRun>(std::move(plan), cameras_->delivered);
   return begun->begin(error) ? begun : nullptr;
 }
 

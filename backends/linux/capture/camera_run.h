@@ -1,6 +1,7 @@
 // CameraRun: one stretch of a camera's stream, from its start to its stop.
 #pragma once
 
+#include "backends/capture/capture_back.h"
 #include "backends/linux/capture/camera_buffers.h"
 #include "backends/linux/capture/camera_counters.h"
 #include "backends/linux/capture/camera_metadata.h"
@@ -31,7 +32,7 @@ struct CameraRunPlan {
 using DeliveredFrames = std::atomic<std::uint64_t>;
 
 // Thread: begin() and end() one at a time; the poller's thread serves in between; counts() and errorCounters() any.
-class CameraRun final : public PolledStream {
+class CameraRun final : public PolledStream, public CaptureRun {
  public:
   CameraRun(CameraRunPlan plan, std::shared_ptr<DeliveredFrames> delivered);
   ~CameraRun() override;

@@ -9,14 +9,6 @@ namespace {
 
 using Fake = FakeCameras;
 
-TEST(LinuxCaptureTest, EveryPathLeadsToTheSameStreams) {
-  Fake fake;
-  const CaptureStreams ofGroup = *fake.group->streams(nullptr);
-  EXPECT_EQ(ofGroup, fake.backStreams());
-  EXPECT_EQ(fake.group->valueForProperty(capture_key::SynchronizationMaster, nullptr)->object(), fake.streams[0]);
-  EXPECT_EQ(*fake.device->streams(nullptr), fake.streams);
-}
-
 TEST(LinuxCaptureTest, ThereIsOneDefaultPlugInAndANewOneEachTimeElse) {
   Fake fake;
   EXPECT_EQ(fake.capture->defaultPlugIn(), fake.capture->defaultPlugIn());
@@ -25,12 +17,6 @@ TEST(LinuxCaptureTest, ThereIsOneDefaultPlugInAndANewOneEachTimeElse) {
   EXPECT_EQ(fake.device->description(), "capture device");
   EXPECT_EQ(fake.wide().description(), "stream of BackFacingCamera");
   EXPECT_EQ(fake.group->description(), "group BackFacingCamera BackFacingTelephotoCamera BackFacingSuperWideCamera");
-}
-
-TEST(LinuxCaptureTest, ABindingWithoutCamerasHasNoDevice) {
-  const auto capture = makeLinuxCapture(Binding());
-  EXPECT_EQ(outcome([&](auto* error) { return capture->createPlugIn()->device(error) != nullptr; }),
-            "2 The binding names no camera, so there is no capture device.");
 }
 
 TEST(LinuxCaptureTest, AGroupOfAnUnknownPortIsLeftOut) {
@@ -115,30 +101,6 @@ TEST(LinuxCaptureTest, TheBindingsControlsAreSetInOrderWhenControlIsTaken) {
   EXPECT_EQ(fake.kernel->with(fake.nodes[3], [](auto& node) { return node.history; }), want);
 }
 
-TEST(LinuxCaptureTest, WhatIsNoStreamOfTheDeviceIsRefused) {
-  Fake fake;
-  const auto other = fake.capture->createPlugIn()->device(nullptr);
-  const CaptureStreams foreign{other->streams(nullptr)->at(0)};
-  EXPECT_EQ(fake.take(foreign), "6 stream of BackFacingCamera is no stream of this device.");
-  EXPECT_EQ(fake.take(CaptureStreams{nullptr}), "6 (null) is no stream of this device.");
-  EXPECT_EQ(outcome([&](auto* error) { return fake.device->relinquishControlOfStreams(foreign, error); }),
-            "6 stream of BackFacingCamera is no stream of this device.");
-}
-
-TEST(LinuxCaptureTest, OnlyWhatIsHeldAndStoppedIsGivenBack) {
-  Fake fake;
-  const CaptureStreams wide{fake.streams[0]};
-  const auto giveBack = [&] {
-    return outcome([&](auto* error) { return fake.device->relinquishControlOfStreams(wide, error); });
-  };
-  EXPECT_EQ(giveBack(), "7 BackFacingCamera is not under control; request control of it first.");
-  fake.prepare(0);
-  ASSERT_EQ(fake.start(0), "done");
-  EXPECT_EQ(giveBack(), "7 BackFacingCamera runs; stop it before giving it back.");
-  ASSERT_EQ(fake.stop(0), "done");
-  EXPECT_EQ(giveBack(), "done");
-}
-
 TEST(LinuxCaptureTest, InvalidatingStopsAndFreesAllAndRefusesEverythingAfter) {
   Fake fake;
   fake.prepare(0);
@@ -184,41 +146,6 @@ TEST(LinuxCaptureTest, TheLastReferenceStopsAndFreesAll) {
   fake.release();
   EXPECT_TRUE(fake.kernel->isIdle());
   EXPECT_EQ(fake.control(kStrobe), 0);
-}
-
-TEST(LinuxCaptureTest, AHandlerThatOwnsADeviceMayGoInEveryWay) {
-  const struct {
-    const char* name;
-    void (*drop)(Fake&);
-  } rows[] = {
-      {"replaced",
-       [](Fake& fake) { fake.set(fake.wide(), capture_key::VideoOutputHandlers, Fake::output(Dictionary{})); }},
-      {"given back", [](Fake& fake) { fake.device->relinquishControlOfStreams({fake.streams[0]}, nullptr); }},
-      {"invalidated", [](Fake& fake) { fake.device->invalidate(nullptr); }},
-      {"invalidated while it streams",
-       [](Fake& fake) {
-         EXPECT_EQ(fake.start(0), "done");
-         fake.device->invalidate(nullptr);
-       }},
-      {"with the last reference", [](Fake& fake) { fake.release(); }},
-  };
-  for (const auto& row : rows) {
-    Fake fake;
-    fake.prepare(0);
-    std::shared_ptr<CaptureDevice> owned = fake.capture->createPlugIn()->device(nullptr);
-    const std::weak_ptr<CaptureDevice> watched = owned;
-    fake.handle(0, [owned = std::move(owned)](PixelBuffer&, MediaTime) {});
-    row.drop(fake);
-    EXPECT_TRUE(watched.expired()) << row.name;
-  }
-}
-
-TEST(LinuxCaptureTest, ADeviceHasTwoProperties) {
-  Fake fake;
-  EXPECT_EQ(outcome([&](auto* error) { return fake.device->valueForProperty("Depth", error); }),
-            "10 The capture device has no property Depth of that use.");
-  EXPECT_EQ(fake.set(*fake.device, capture_key::MulticamSessionStatus, 1),
-            "10 The capture device has no property MulticamSessionStatus of that use.");
 }
 
 }  // namespace

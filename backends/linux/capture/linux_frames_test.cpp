@@ -336,7 +336,7 @@ TEST(LinuxFramesTest, WhatFailsAtTheStopIsToldAndNothingStaysBusy) {
     ASSERT_EQ(fake.start(0), "done");
     fake.kernel->failNext(fake.nodes[0], request, EIO);
     EXPECT_EQ(fake.stop(0), "1 " + std::string(name) + " on " + fake.nodes[0] + " failed: Input/output error (EIO)");
-    EXPECT_EQ(fake.stop(0), "7 BackFacingCamera is not running.");
+    EXPECT_EQ(fake.stop(0), "7 BackFacingCamera is not running; it cannot be stopped.");
     EXPECT_EQ(fake.kernel->with(fake.nodes[0], [](auto& node) { return node.mapped; }), 0);
     fake.release();
   }

@@ -34,7 +34,7 @@ TEST(LinuxFramesThreadsTest, AHandlerMayReadStopAndLetGoOfEverything) {
   std::unique_lock lock(mutex);
   ASSERT_TRUE(changed.wait_for(lock, 5s, [&] { return done; }));
   EXPECT_EQ(stopped, "done");
-  EXPECT_EQ(again, "7 BackFacingCamera is not running.");
+  EXPECT_EQ(again, "7 BackFacingCamera is not running; it cannot be stopped.");
   for (int i = 0; i < 500 && !fake.kernel->isIdle(); ++i) std::this_thread::sleep_for(1ms);
   EXPECT_TRUE(fake.kernel->isIdle());
 }

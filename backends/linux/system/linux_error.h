@@ -2,6 +2,7 @@
 #pragma once
 
 #include "contract/diagnostic_error.h"
+#include "contract/message_format.h"
 
 #include <cerrno>
 #include <cstdint>
@@ -33,7 +34,14 @@ inline bool isNoAccess(int number) { return number == EACCES || number == EPERM;
 
 // Stores an error where `error` is not null.
 void failLinux(DiagnosticErrorPtr* error, LinuxErrorCode code, std::string message);
-// The same for a call that failed with `number` (errno). The code follows from the number: EACCES and EPERM are
+// The same, made by a format; false.
+template <class... Arguments>
+bool refuseLinux(DiagnosticErrorPtr* error, LinuxErrorCode code, MessageFormat<Arguments...> format,
+                 const Arguments&... arguments) {
+  if (error != nullptr) failLinux(error, code, formatMessage<Arguments...>(format, arguments...));
+  return false;
+}
+// Stores one for a call that failed with `number` (errno). The code follows from the number: EACCES and EPERM are
 // kNoAccess, EBUSY is kBusy, ENODEV and ENXIO are kDeviceGone, everything else is kSystemCall. The message is
 // "CALL on OBJECT failed: TEXT (NAME)", as "VIDIOC_STREAMON on /dev/video0 failed: Invalid argument (EINVAL)".
 void failSystemCall(DiagnosticErrorPtr* error, std::string_view call, std::string_view object, int number);

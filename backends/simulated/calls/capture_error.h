@@ -1,6 +1,7 @@
 // The errors of the simulated capture service.
 #pragma once
 
+#include "backends/capture/capture_refusal.h"
 #include "contract/diagnostic_error.h"
 
 #include <cstdint>
@@ -27,12 +28,22 @@ enum class CaptureErrorCode : std::int64_t {
   kInvalidated = 13          // the device has been invalidated
 };
 
-// Tells a refusal: stores an error of the service where the caller asked for one, and is false.
-template <class... Arguments>
-bool refuse(DiagnosticErrorPtr* error, CaptureErrorCode code, MessageFormat<Arguments...> format,
-            const Arguments&... arguments) {
-  fail(error, SimulatedCaptureErrorDomain, static_cast<std::int64_t>(code), nullptr, format, arguments...);
-  return false;
+constexpr CaptureErrorCode captureErrorCode(CaptureRefusal reason) {
+  switch (reason) {
+    case CaptureRefusal::kNoDevice: return CaptureErrorCode::kNoDevice;
+    case CaptureRefusal::kUnknownProperty: return CaptureErrorCode::kUnknownProperty;
+    case CaptureRefusal::kReadOnlyProperty: return CaptureErrorCode::kReadOnlyProperty;
+    case CaptureRefusal::kWrongType: return CaptureErrorCode::kWrongType;
+    case CaptureRefusal::kOutOfRange: return CaptureErrorCode::kOutOfRange;
+    case CaptureRefusal::kUnsupported: return CaptureErrorCode::kUnsupported;
+    case CaptureRefusal::kNotControlled: return CaptureErrorCode::kNotControlled;
+    case CaptureRefusal::kControlledByAnother: return CaptureErrorCode::kControlledByAnother;
+    case CaptureRefusal::kWrongState: return CaptureErrorCode::kWrongState;
+    case CaptureRefusal::kUnreadableProperty: return CaptureErrorCode::kUnreadableProperty;
+    case CaptureRefusal::kForeignObject: return CaptureErrorCode::kForeignObject;
+    case CaptureRefusal::kInvalidated: return CaptureErrorCode::kInvalidated;
+  }
+  return CaptureErrorCode::kWrongState;
 }
 
 }  // namespace quazor

@@ -1,7 +1,6 @@
 #include "backends/simulated/capture/capture_hardware.h"
 
 #include "backends/simulated/capture/growth.h"
-#include "backends/simulated/capture/output_state.h"
 #include "platform/capture_keys.h"
 
 #include <stdexcept>
@@ -10,49 +9,40 @@
 namespace quazor {
 namespace {
 
-std::size_t indexOf(const Scenario& scenario, const std::string& id) {
-  for (std::size_t i = 0; i < scenario.cameras.size(); ++i) {
-    if (scenario.cameras[i].id == id) return i;
-  }
-  throw std::invalid_argument("The scenario has no camera " + id + ".");
-}
-
-GroupState stateOf(const CameraGroup& group, const Scenario& scenario) {
-  GroupState state;
-  state.id = group.id;
-  for (const std::string& camera : group.cameras) state.cameras.push_back(indexOf(scenario, camera));
-  state.master = indexOf(scenario, group.master);
-  state.masterConfigurationSupported = group.masterConfiguration;
-  return state;
+// Null where no output with a handler is enabled.
+std::shared_ptr<FrameDelivery> makeDelivery(const CaptureHardware& hardware, std::size_t index, const StreamRun& times,
+                                            const CameraSettings& settings) {
+  FrameDelivery::Source source;
+  source.frames = settings.frameHandler();
+  source.events = settings.eventHandler();
+  if (source.frames == nullptr && source.events == nullptr) return nullptr;
+  source.index = index;
+  source.camera = hardware.cameras[index].camera;
+  source.run = times;
+  source.lit = toUnsigned(entryOf(&settings.lightSource, capture_key::Mode)) != 0;
+  return std::make_shared<FrameDelivery>(std::move(source), hardware.pool, hardware.clock);
 }
 
 }  // namespace
 
-double CameraState::formatMaximum() const {
-  return camera.formats[static_cast<std::size_t>(toUnsigned(&formatIndex))].maximumFrameRate;
+double CameraState::formatMaximum(const CameraSettings& settings) const {
+  return camera.formats[static_cast<std::size_t>(toUnsigned(&settings.formatIndex))].maximumFrameRate;
 }
 
-double CameraState::maximumRate() const { return maximumFrameRate ? toDouble(&*maximumFrameRate) : formatMaximum(); }
-
-double CameraState::minimumRate() const { return minimumFrameRate ? toDouble(&*minimumFrameRate) : maximumRate(); }
-
-Value CameraState::darkness() {
-  return Dictionary{{std::string(capture_key::Mode), 0},
-                    {std::string(capture_key::StructuredLightPattern), 0},
-                    {std::string(capture_key::StructuredLightCurrent), 0}};
+double CameraState::deliveredRate(const CameraSettings& settings) const {
+  if (camera.actualFrameRate) return *camera.actualFrameRate;
+  return settings.maximumRate ? toDouble(&*settings.maximumRate) : formatMaximum(settings);
 }
 
-std::optional<Dictionary> CameraState::errorCounters(std::chrono::nanoseconds now) const {
+std::optional<Dictionary> CameraState::errorCounters(const StreamRun* run, std::chrono::nanoseconds now) const {
   std::optional<Dictionary> counters = camera.errorCounters;
-  if (!counters || !run) return counters;
+  if (!counters || run == nullptr) return counters;
   const std::chrono::nanoseconds streamed = run->stopped.value_or(now) - run->started;
   for (const auto& [name, perSecond] : camera.errorCounterGrowth) {
     counters->set(name, toUnsigned(counters->find(name)) + grownBy(toUnsigned(&perSecond), streamed));
   }
   return counters;
 }
-
-double CameraState::deliveredRate() const { return camera.actualFrameRate.value_or(maximumRate()); }
 
 CaptureHardware::CaptureHardware(const Scenario& scenario, std::shared_ptr<Clock> time,
                                  std::shared_ptr<Concurrency> queues)
@@ -66,59 +56,31 @@ CaptureHardware::CaptureHardware(const Scenario& scenario, std::shared_ptr<Clock
     state.camera = camera;
     cameras.push_back(std::move(state));
   }
-  for (const CameraGroup& group : scenario.groups) groups.push_back(stateOf(group, scenario));
 }
 
-void CaptureHardware::start(CameraState& camera) {
-  camera.running = true;
+std::shared_ptr<SimulatedRun> CaptureHardware::start(std::size_t camera, const CameraSettings& settings) {
+  CameraState& state = cameras[camera];
   if (runningStreams++ == 0) streamingSince = clock->now();
-  camera.run = StreamRun{clock->now(), std::nullopt, microFrameRate(camera.deliveredRate())};
-  const auto index = static_cast<std::size_t>(&camera - cameras.data());
-  camera.delivery = makeDelivery(camera, index, pool, clock);
-  if (camera.delivery != nullptr) camera.delivery->begin(*concurrency);
+  auto run = std::make_shared<SimulatedRun>();
+  run->times = StreamRun{clock->now(), std::nullopt, microFrameRate(state.deliveredRate(settings))};
+  run->delivery = makeDelivery(*this, camera, run->times, settings);
+  if (run->delivery != nullptr) run->delivery->begin(*concurrency);
+  state.running = run;
+  return run;
 }
 
-std::shared_ptr<FrameDelivery> CaptureHardware::stop(CameraState& camera) {
-  camera.running = false;
-  camera.run->stopped = clock->now();
+void CaptureHardware::stop(SimulatedRun& run) {
+  if (run.times.stopped) return;
+  run.times.stopped = clock->now();
   if (--runningStreams == 0) streamedBefore += clock->now() - streamingSince;
-  if (camera.delivery != nullptr) camera.delivery->close();
-  return std::exchange(camera.delivery, nullptr);
-}
-
-std::vector<std::shared_ptr<FrameDelivery>> CaptureHardware::release(CaptureUserId user) {
-  std::vector<std::shared_ptr<FrameDelivery>> stopped;
+  if (run.delivery != nullptr) run.delivery->close();
   for (CameraState& camera : cameras) {
-    if (camera.holder != user) continue;
-    if (camera.running) stopped.push_back(stop(camera));
-    camera.holder = 0;
-    camera.outputHandlers = Dictionary{};
+    if (camera.running.get() == &run) camera.running.reset();
   }
-  std::erase(stopped, nullptr);
-  return stopped;
 }
 
 std::chrono::nanoseconds CaptureHardware::streamedTime() const {
   return runningStreams == 0 ? streamedBefore : streamedBefore + (clock->now() - streamingSince);
-}
-
-std::optional<Dictionary> CaptureHardware::sessionStatus() const {
-  const std::chrono::nanoseconds now = clock->now();
-  std::optional<Dictionary> status;
-  for (const std::size_t index : configuredGroups) {
-    const GroupState& group = groups[index];
-    const std::optional<StreamRun>& master = cameras[group.master].run;
-    if (!master) continue;
-    if (!status) status.emplace();
-    for (const std::size_t member : group.active) {
-      const CameraState& state = cameras[member];
-      if (!state.camera.inSessionStatus) continue;
-      const SessionCount count = state.run ? countSession(state.camera, *state.run, *master, now) : SessionCount{0, -1};
-      status->set(state.camera.port, Dictionary{{std::string(capture_key::Offset), count.offset},
-                                                {std::string(capture_key::FrameCount), count.frameCount}});
-    }
-  }
-  return status;
 }
 
 }  // namespace quazor

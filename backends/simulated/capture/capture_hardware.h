@@ -1,6 +1,7 @@
 // CaptureHardware: the state of the simulated cameras, which all users of the capture service share.
 #pragma once
 
+#include "backends/capture/capture_back.h"
 #include "backends/simulated/capture/frame_delivery.h"
 #include "backends/simulated/capture/pixel_buffer_pool.h"
 #include "backends/simulated/capture/session_status.h"
@@ -20,55 +21,30 @@
 
 namespace quazor {
 
-// One user of the capture device: each device that a plug-in hands out. 0 is nobody.
-using CaptureUserId = std::uint64_t;
+// One stretch of a camera's stream. Thread: any, holding the hardware's mutex.
+struct SimulatedRun final : CaptureRun {
+  StreamRun times;
+  std::shared_ptr<FrameDelivery> delivery;  // null where nothing is delivered, and after the stop
+};
 
 struct CameraState {
   Camera camera;
-  CaptureUserId holder = 0;
-  bool running = false;
-  std::optional<StreamRun> run;             // the present stretch, or else the last one
-  std::shared_ptr<FrameDelivery> delivery;  // while it runs
+  std::shared_ptr<SimulatedRun> running;  // null while the stream does not run
 
-  // As they were set, so that they read back as the kind of number they were.
-  Value formatIndex{0U};
-  std::optional<Value> maximumFrameRate;  // while not set, the format's
-  std::optional<Value> minimumFrameRate;  // while not set, the maximum
-  Value multipleOutputs{false};
-  Value slaveConfiguration{Dictionary{}};
-  Value autoExposure{true};
-  Value lightSource = darkness();  // of cameras with a projector
-  Value outputConfigurations{Dictionary{}};
-  Value outputsEnabled{Dictionary{}};
-  Value outputHandlers{Dictionary{}};  // the holder's; dropped when the stream is given back
-
-  // The InfraredLightSourceConfiguration that lets nothing fire.
-  static Value darkness();
   // The highest frame rate of the format that is set.
-  double formatMaximum() const;
-  double minimumRate() const;
-  double maximumRate() const;
+  double formatMaximum(const CameraSettings& settings) const;
   // The rate at which frames would really come.
-  double deliveredRate() const;
-  // What ErrorCounters reads: the scenario's counters and what they have grown by in the present or the last stretch.
-  // Nothing when they cannot be read.
-  std::optional<Dictionary> errorCounters(std::chrono::nanoseconds now) const;
+  double deliveredRate(const CameraSettings& settings) const;
+  // What ErrorCounters reads: the scenario's counters and what they have grown by in `run`, the present or the last
+  // stretch, or null. Nothing when they cannot be read.
+  std::optional<Dictionary> errorCounters(const StreamRun* run, std::chrono::nanoseconds now) const;
 };
 
-struct GroupState {
-  std::string id;
-  std::vector<std::size_t> cameras;  // indexes, in the group's order
-  std::size_t master = 0;            // the index of one of them
-  bool masterConfigurationSupported = true;
-  std::vector<std::size_t> active;  // what ActiveStreams was set to
-  Value masterConfiguration{Dictionary{}};
-};
-
-// Plain data under one lock; the objects of the capture service (simulated_capture.h) hold the rules.
+// Plain data under one lock: what of the cameras other devices of the phone depend on.
 //
 // Thread: any, holding `mutex`; what is const needs no lock.
 struct CaptureHardware {
-  // Throws std::invalid_argument when a camera has no format or a group names a camera that there is not.
+  // Throws std::invalid_argument when a camera has no format.
   CaptureHardware(const Scenario& scenario, std::shared_ptr<Clock> clock, std::shared_ptr<Concurrency> concurrency);
 
   const CaptureDeviceConfig device;
@@ -78,25 +54,16 @@ struct CaptureHardware {
 
   std::mutex mutex;
   std::vector<CameraState> cameras;
-  std::vector<GroupState> groups;
-  std::vector<std::size_t> configuredGroups;  // what MultiCamConfiguration was set to
-  CaptureUserId lastUser = 0;
   std::size_t runningStreams = 0;
   std::chrono::nanoseconds streamedBefore{0};  // until the last moment at which no stream ran
   std::chrono::nanoseconds streamingSince{0};  // while any stream runs
 
-  // Starts the camera's stream, at the rate that is set now.
-  void start(CameraState& camera);
-  // Stops the camera's stream, which runs. No handler begins any more; the result, null where none could, is to be
-  // finished when the mutex is given back.
-  std::shared_ptr<FrameDelivery> stop(CameraState& camera);
-  // Gives back what the user has: its streams stop, lose their handlers and are free. As stop() for each that ran.
-  std::vector<std::shared_ptr<FrameDelivery>> release(CaptureUserId user);
+  // Starts the stream of the camera of that index, at the rate that is set now.
+  std::shared_ptr<SimulatedRun> start(std::size_t camera, const CameraSettings& settings);
+  // The stretch ends now, unless it has already, and no handler begins any more.
+  void stop(SimulatedRun& run);
   // For how long any stream has been running until now.
   std::chrono::nanoseconds streamedTime() const;
-  // MulticamSessionStatus: an entry for every active stream of the configured groups; nothing when no session of
-  // theirs has begun.
-  std::optional<Dictionary> sessionStatus() const;
 };
 
 }  // namespace quazor

@@ -138,17 +138,18 @@ void FrameDelivery::close() {
   closed_ = true;
 }
 
+void FrameDelivery::quiesce() {
+  if (!source_.camera.delivery.stopWaitsForHandlers) return;
+  std::unique_lock lock(mutex_);
+  quiet_.wait(lock, [this] {
+    return std::ranges::all_of(calling_, [](std::thread::id id) { return id == std::this_thread::get_id(); });
+  });
+}
+
 void FrameDelivery::finish() {
-  const DeliveryConfig& traits = source_.camera.delivery;
-  if (traits.stopWaitsForHandlers) {
-    std::unique_lock lock(mutex_);
-    quiet_.wait(lock, [this] {
-      return std::ranges::all_of(calling_, [](std::thread::id id) { return id == std::this_thread::get_id(); });
-    });
-  }
   if (source_.frames == nullptr) return;
   auto frame = static_cast<std::uint64_t>(Wide{sinceStart().count()} * static_cast<Wide>(source_.run.rate) / kFrame);
-  for (std::uint64_t i = 0; i < traits.framesAfterStop; ++i, ++frame) {
+  for (std::uint64_t i = 0; i < source_.camera.delivery.framesAfterStop; ++i, ++frame) {
     queues_.front()->async([self = shared_from_this(), frame] { self->callHandler(frame); });
   }
 }

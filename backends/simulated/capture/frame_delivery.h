@@ -52,8 +52,10 @@ class FrameDelivery final : public std::enable_shared_from_this<FrameDelivery> {
   void begin(Concurrency& concurrency);
   // From here on no handler begins to run.
   void close();
-  // Ends a stop, after close(): waits until no handler runs any more, where the scenario has stops wait; then the
-  // scenario's frames after the stop are on their way. A handler that stops its own stream is not waited for.
+  // After close(): waits until no handler runs any more, where the scenario has stops wait. A handler that stops its
+  // own stream is not waited for.
+  void quiesce();
+  // Ends a stop, once: the scenario's frames after the stop are on their way.
   void finish();
   // Calls the frame handler with the next `count` frames at once, on this thread, without regard to time; counts from
   // 0, apart from the frames that come by themselves. For benches. Returns how many were delivered: fewer when the

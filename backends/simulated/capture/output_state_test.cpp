@@ -1,4 +1,4 @@
-#include "backends/simulated/capture/output_state.h"
+#include "backends/simulated/capture/simulated_capture.h"
 
 #include "backends/simulated/phone_for_tests.h"
 #include "platform/pixel_buffer.h"
@@ -41,38 +41,6 @@ Dictionary light(Value mode, Value pattern, Value current) {
 }
 
 Dictionary primary(Value value) { return {{"PrimaryScaler", value}}; }
-
-TEST_F(OutputPropertiesTest, TheirDefaultsAreRead) {
-  EXPECT_EQ(read("AEEnabled"), "1");
-  EXPECT_EQ(read("InfraredLightSourceConfiguration"),
-            "{Mode = 0; StructuredLightPattern = 0; StructuredLightCurrent = 0}");
-  EXPECT_EQ(read("VideoOutputConfigurations"), "{}");
-  EXPECT_EQ(read("VideoOutputsEnabled"), "{}");
-  EXPECT_EQ(read("VideoOutputHandlers"), "{}");
-}
-
-TEST_F(OutputPropertiesTest, TheyReadBackAsTheyWereSet) {
-  ASSERT_TRUE(user_.control({user_.streams[0]}));
-  const struct {
-    const char* key;
-    Value value;
-  } kRows[] = {
-      {"AEEnabled", false},
-      {"InfraredLightSourceConfiguration", light(2, 1, 0)},
-      {"InfraredLightSourceConfiguration", light(255U, 255U, 255U)},
-      {"VideoOutputConfigurations", Dictionary{}},
-      {"VideoOutputConfigurations", primary(Dictionary{})},
-      {"VideoOutputConfigurations", primary(Dictionary{{"AttachRaw", true}})},
-      {"VideoOutputsEnabled", primary(true)},
-      {"VideoOutputsEnabled", Dictionary{}},
-      {"VideoOutputHandlers", primary(Dictionary{})},
-      {"VideoOutputHandlers", primary(Dictionary{{"PixelBufferHandler", kFrames}, {"EventHandler", kEvents}})},
-  };
-  for (const auto& row : kRows) {
-    EXPECT_EQ(set(row.key, row.value), "done") << row.key;
-    EXPECT_EQ(user_.wide().valueForProperty(row.key, nullptr), row.value) << row.key;
-  }
-}
 
 TEST_F(OutputPropertiesTest, WrongValuesAreRefusedAndChangeNothing) {
   ASSERT_TRUE(user_.control({user_.streams[0]}));
@@ -133,17 +101,6 @@ TEST_F(OutputPropertiesTest, WrongValuesAreRefusedAndChangeNothing) {
     EXPECT_EQ(set(row.key, row.value), row.refused) << row.name;
     EXPECT_EQ(read(row.key), before) << row.name;
   }
-}
-
-TEST_F(OutputPropertiesTest, TheyNeedControlOfAStoppedStream) {
-  const std::string uncontrolled =
-      refusal(Code::kNotControlled, "wide is not under control; request control of it first.");
-  EXPECT_EQ(set("AEEnabled", false), uncontrolled);
-  EXPECT_EQ(set("VideoOutputHandlers", Dictionary{}), uncontrolled);
-  ASSERT_TRUE(user_.control({user_.streams[0]}));
-  ASSERT_TRUE(user_.wide().start(nullptr));
-  EXPECT_EQ(set("VideoOutputHandlers", Dictionary{}),
-            refusal(Code::kWrongState, "wide is running; VideoOutputHandlers cannot be set until it is stopped."));
 }
 
 TEST_F(OutputPropertiesTest, ACameraWithoutAProjectorHasNoLightToConfigure) {

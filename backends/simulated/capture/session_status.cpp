@@ -10,7 +10,7 @@ namespace {
 __extension__ using Wide = __int128;
 
 // Nanoseconds times millionths of a frame per second, for one frame.
-constexpr Wide kFrame = Wide{1'000'000'000} * 1'000'000;
+constexpr Wide kFrameScale = Wide{1'000'000'000} * 1'000'000;
 
 Wide wide(std::chrono::nanoseconds duration) { return duration.count(); }
 
@@ -41,12 +41,12 @@ SessionCount countSession(const Camera& camera, const StreamRun& run, const Stre
   const Wide masterRate = static_cast<Wide>(master.rate);
 
   const Wide late = std::max(Wide{0}, wide(run.started) - wide(master.started));
-  const Wide offset = dividedUp(late * masterRate, kFrame) + static_cast<Wide>(camera.firstFrameOffset);
+  const Wide offset = dividedUp(late * masterRate, kFrameScale) + static_cast<Wide>(camera.firstFrameOffset);
 
   // The camera's own time, from the master's frame with which it begins, in units of 1 / masterRate.
-  const Wide streamed = (wide(run.stopped.value_or(now)) - wide(master.started)) * masterRate - offset * kFrame;
+  const Wide streamed = (wide(run.stopped.value_or(now)) - wide(master.started)) * masterRate - offset * kFrameScale;
   if (!camera.deliversFrames || streamed <= 0) return kNoFrames;
-  const Wide possible = streamed * rate / (masterRate * kFrame);
+  const Wide possible = streamed * rate / (masterRate * kFrameScale);
   const Wide delivered = possible - dropped(camera, possible);
   if (delivered == 0) return kNoFrames;
   return {static_cast<std::int64_t>(offset), static_cast<std::int64_t>(delivered)};

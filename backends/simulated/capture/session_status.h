@@ -1,6 +1,7 @@
 // The arithmetic of a synchronised session: which frames came.
 #pragma once
 
+#include "backends/capture/capture_back.h"
 #include "backends/simulated/scenario/scenario.h"
 
 #include <chrono>
@@ -20,14 +21,6 @@ struct StreamRun {
   std::chrono::nanoseconds started{0};
   std::optional<std::chrono::nanoseconds> stopped;  // nothing while it runs
   MicroFrameRate rate = 1;
-};
-
-// A camera's part in a session.
-struct SessionCount {
-  std::int64_t offset = 0;      // frames of the master before the camera's first
-  std::int64_t frameCount = 0;  // frames that came since; -1 when none did
-
-  friend bool operator==(const SessionCount&, const SessionCount&) = default;
 };
 
 // What a camera has delivered by `now` in the session that its group's master began.

@@ -39,53 +39,6 @@ TEST_F(SimulatedCaptureTest, ObjectsDescribeThemselves) {
   EXPECT_EQ(plugIn->device(nullptr)->description(), "capture device");
 }
 
-TEST_F(SimulatedCaptureTest, PlugInsAreNewAndTheDefaultOneIsShared) {
-  const auto service = phone_.platform().capture;
-  EXPECT_NE(service->createPlugIn(), service->createPlugIn());
-  EXPECT_NE(service->defaultPlugIn(), nullptr);
-  EXPECT_EQ(service->defaultPlugIn(), service->defaultPlugIn());
-}
-
-TEST_F(SimulatedCaptureTest, StreamsAndGroupsAreTheSameObjectsOnEveryPath) {
-  EXPECT_EQ(user_.device->streams(nullptr), user_.streams);
-  EXPECT_EQ(user_.device->synchronizedStreamsGroups(nullptr), user_.groups);
-  EXPECT_EQ((*user_.groups[1]->streams(nullptr))[0], user_.streams[2]);
-}
-
-TEST_F(SimulatedCaptureTest, EveryDeviceIsAUserOfItsOwn) {
-  const PhoneUser other(phone_);
-  EXPECT_NE(other.streams[0], user_.streams[0]);
-  EXPECT_EQ(request(user_, {user_.streams[0]}), "done");
-  EXPECT_EQ(request(other, {other.streams[0]}),
-            refusal(Code::kControlledByAnother, "wide is under control of another user."));
-  EXPECT_EQ(outcome([&](DiagnosticErrorPtr* error) { return other.wide().start(error); }),
-            refusal(Code::kControlledByAnother, "wide is under control of another user."));
-}
-
-TEST_F(SimulatedCaptureTest, ControlIsTakenOfAllStreamsOrNone) {
-  const PhoneUser other(phone_);
-  ASSERT_EQ(request(other, {other.streams[1]}), "done");
-  EXPECT_EQ(request(user_, user_.streams),
-            refusal(Code::kControlledByAnother, "tele is under control of another user."));
-  EXPECT_EQ(request(other, {other.streams[0], other.streams[2]}), "done");
-}
-
-TEST_F(SimulatedCaptureTest, ControlMayBeTakenAgainByItsHolder) {
-  EXPECT_EQ(request(user_, {user_.streams[0]}), "done");
-  EXPECT_EQ(request(user_, user_.streams), "done");
-}
-
-TEST_F(SimulatedCaptureTest, ControlIsGivenBackOfAllStreamsOrNone) {
-  const PhoneUser other(phone_);
-  ASSERT_EQ(request(user_, {user_.streams[0]}), "done");
-  EXPECT_EQ(relinquish(user_, user_.backStreams()),
-            refusal(Code::kNotControlled, "tele is not under control; request control of it first."));
-  EXPECT_EQ(request(other, {other.streams[0]}),
-            refusal(Code::kControlledByAnother, "wide is under control of another user."));
-  EXPECT_EQ(relinquish(user_, {user_.streams[0]}), "done");
-  EXPECT_EQ(request(other, {other.streams[0]}), "done");
-}
-
 TEST_F(SimulatedCaptureTest, ARunningStreamIsNotGivenBack) {
   ASSERT_TRUE(user_.control({user_.streams[0]}) && user_.wide().start(nullptr));
   EXPECT_EQ(relinquish(user_, {user_.streams[0]}),
@@ -97,62 +50,6 @@ TEST_F(SimulatedCaptureTest, StreamsOfOthersAreRefused) {
   EXPECT_EQ(request(user_, {other.streams[0]}),
             refusal(Code::kForeignObject, "stream wide (BackFacingCamera) is no stream of this device."));
   EXPECT_EQ(relinquish(user_, {nullptr}), refusal(Code::kForeignObject, "(null) is no stream of this device."));
-}
-
-TEST_F(SimulatedCaptureTest, WhatAUserHadIsFreeWhenItsLastObjectIsGone) {
-  auto leaving = std::make_unique<PhoneUser>(phone_);
-  ASSERT_TRUE(leaving->control(leaving->streams) && leaving->wide().start(nullptr));
-  std::shared_ptr<CaptureStream> last = leaving->streams[2];
-  leaving.reset();
-  EXPECT_EQ(request(user_, user_.streams),
-            refusal(Code::kControlledByAnother, "wide is under control of another user."));
-  last.reset();
-  EXPECT_EQ(request(user_, user_.streams), "done");
-  EXPECT_TRUE(user_.wide().start(nullptr));
-}
-
-TEST_F(SimulatedCaptureTest, AnInvalidatedDeviceGivesBackWhatItHadAndRefusesEveryCall) {
-  const PhoneUser other(phone_);
-  ASSERT_TRUE(user_.control(user_.streams) && user_.wide().start(nullptr));
-  EXPECT_TRUE(user_.device->invalidate(nullptr));
-  EXPECT_EQ(request(other, other.streams), "done");
-  EXPECT_TRUE(other.wide().start(nullptr));
-
-  const std::string expected =
-      refusal(Code::kInvalidated, "The capture device has been invalidated; ask for a new one.");
-  const std::function<bool(DiagnosticErrorPtr*)> calls[] = {
-      [&](DiagnosticErrorPtr* error) { return user_.device->streams(error).has_value(); },
-      [&](DiagnosticErrorPtr* error) { return user_.device->synchronizedStreamsGroups(error).has_value(); },
-      [&](DiagnosticErrorPtr* error) { return user_.device->requestControlOfStreams({}, error); },
-      [&](DiagnosticErrorPtr* error) { return user_.device->relinquishControlOfStreams({}, error); },
-      [&](DiagnosticErrorPtr* error) { return user_.device->invalidate(error); },
-      [&](DiagnosticErrorPtr* error) {
-        return user_.device->valueForProperty(capture_key::MultiCamConfiguration, error).has_value();
-      },
-      [&](DiagnosticErrorPtr* error) {
-        return user_.device->setValue(groups({}), capture_key::MultiCamConfiguration, error);
-      },
-      [&](DiagnosticErrorPtr* error) { return user_.back().streams(error).has_value(); },
-      [&](DiagnosticErrorPtr* error) {
-        return user_.back().valueForProperty(capture_key::ActiveStreams, error).has_value();
-      },
-      [&](DiagnosticErrorPtr* error) { return user_.back().setValue(Array{}, capture_key::ActiveStreams, error); },
-      [&](DiagnosticErrorPtr* error) {
-        return user_.wide().valueForProperty(capture_key::PortType, error).has_value();
-      },
-      [&](DiagnosticErrorPtr* error) { return user_.wide().setValue(0, capture_key::FormatIndex, error); },
-      [&](DiagnosticErrorPtr* error) { return user_.wide().start(error); },
-      [&](DiagnosticErrorPtr* error) { return user_.wide().stop(error); },
-  };
-  for (const auto& call : calls) EXPECT_EQ(outcome(call), expected) << "call " << &call - calls;
-}
-
-TEST_F(SimulatedCaptureTest, TheConfigurationOfTheSessionReadsBack) {
-  EXPECT_EQ(user_.device->valueForProperty(capture_key::MultiCamConfiguration, nullptr), groups({}));
-  ASSERT_TRUE(user_.configureSession());
-  EXPECT_EQ(user_.device->valueForProperty(capture_key::MultiCamConfiguration, nullptr), groups({user_.groups[0]}));
-  EXPECT_EQ(configure(groups({})), "done");
-  EXPECT_EQ(user_.device->valueForProperty(capture_key::MultiCamConfiguration, nullptr), groups({}));
 }
 
 TEST_F(SimulatedCaptureTest, ConfigurationsThatDoNotFitAreRefusedAndChangeNothing) {
@@ -208,24 +105,6 @@ TEST_F(SimulatedCaptureTest, DevicePropertiesThatAreUnknownOrReadOnlyAreRefused)
             refusal(Code::kReadOnlyProperty, "capture device: MulticamSessionStatus can only be read."));
 }
 
-TEST_F(SimulatedCaptureTest, ThereIsNoStatusBeforeTheMasterOfASessionHasStarted) {
-  const auto status = [&] {
-    return outcome([&](DiagnosticErrorPtr* error) {
-      return user_.device->valueForProperty(capture_key::MulticamSessionStatus, error);
-    });
-  };
-  const std::string none = refusal(Code::kUnreadableProperty,
-                                   "capture device: MulticamSessionStatus cannot be read before a synchronised session "
-                                   "has begun: set MultiCamConfiguration, then start the master.");
-  EXPECT_EQ(status(), none);
-  ASSERT_TRUE(user_.configureSession());
-  EXPECT_EQ(status(), none);
-  ASSERT_TRUE(user_.tele().start(nullptr));
-  EXPECT_EQ(status(), none);
-  ASSERT_TRUE(user_.wide().start(nullptr));
-  EXPECT_EQ(status(), "done");
-}
-
 TEST_F(SimulatedCaptureTest, TheStatusFollowsFromWhatWasStreamed) {
   const auto clock = phone_.platform().clock;
   ASSERT_TRUE(user_.configureSession() && user_.wide().start(nullptr));
@@ -259,14 +138,6 @@ TEST_F(SimulatedCaptureTest, TheStatusCountsAtTheRateThatWasSet) {
   EXPECT_EQ(user_.status(),
             "{BackFacingCamera = {Offset = 0; FrameCount = 100}; "
             "BackFacingTelephotoCamera = {Offset = 0; FrameCount = 100}}");
-}
-
-TEST_F(SimulatedCaptureTest, ANewConfigurationIsANewSession) {
-  ASSERT_TRUE(user_.configureSession() && user_.wide().start(nullptr));
-  phone_.platform().clock->sleep(1s);
-  ASSERT_TRUE(user_.wide().stop(nullptr));
-  ASSERT_EQ(configure(groups({user_.groups[0]})), "done");
-  EXPECT_EQ(user_.status(), "(null)");
 }
 
 TEST(SimulatedCaptureConfig, TheStatusFollowsTheCamerasOfTheScenario) {

@@ -1,4 +1,4 @@
-#include "backends/simulated/capture/simulated_group.h"
+#include "backends/simulated/capture/simulated_capture.h"
 
 #include "backends/simulated/phone_for_tests.h"
 
@@ -38,32 +38,6 @@ class SimulatedGroupTest : public ::testing::Test {
 
 TEST_F(SimulatedGroupTest, DescribesItself) { EXPECT_EQ(user_.back().description(), "group back"); }
 
-TEST_F(SimulatedGroupTest, ItsStreamsAreTheDevicesInTheGroupsOrder) {
-  EXPECT_EQ(user_.back().streams(nullptr), user_.backStreams());
-}
-
-TEST_F(SimulatedGroupTest, ItsMasterIsTheStreamItself) {
-  EXPECT_EQ(read(capture_key::SynchronizationMaster)->object(), user_.streams[0]);
-}
-
-TEST_F(SimulatedGroupTest, SaysWhatTheMasterConfigurationMayHold) {
-  EXPECT_EQ(read(capture_key::MasterConfigurationSupportedKeys), Value(Array{"SlaveConfigurationByPortType"}));
-}
-
-TEST_F(SimulatedGroupTest, PropertiesReadBackAsTheyWereSet) {
-  EXPECT_EQ(read(capture_key::ActiveStreams), Value(Array{}));
-  EXPECT_EQ(read(capture_key::MasterConfiguration), Value(Dictionary{}));
-  ASSERT_TRUE(user_.control(user_.backStreams()));
-  const Value active(Array{user_.streams[1], user_.streams[0]});
-  EXPECT_EQ(set("ActiveStreams", active), "done");
-  EXPECT_EQ(read("ActiveStreams"), active);
-  const Value configuration(masterConfiguration("BackFacingTelephotoCamera", slaveConfiguration()));
-  EXPECT_EQ(set("MasterConfiguration", configuration), "done");
-  EXPECT_EQ(read("MasterConfiguration"), configuration);
-  EXPECT_EQ(set("ActiveStreams", Array{}), "done");
-  EXPECT_EQ(read("ActiveStreams"), Value(Array{}));
-}
-
 TEST_F(SimulatedGroupTest, ValuesThatDoNotFitAreRefusedAndChangeNothing) {
   ASSERT_TRUE(user_.control(user_.streams));
   ASSERT_TRUE(user_.back().setValue(Array{user_.streams[0]}, capture_key::ActiveStreams, nullptr));
@@ -98,7 +72,7 @@ TEST_F(SimulatedGroupTest, ValuesThatDoNotFitAreRefusedAndChangeNothing) {
       {"a configuration that is no dictionary", "MasterConfiguration", 1, Code::kWrongType,
        "back: MasterConfiguration must be a dictionary, not the number 1."},
       {"a configuration of another kind", "MasterConfiguration", Dictionary{{"Speed", 1}}, Code::kOutOfRange,
-       "back: MasterConfiguration must hold only SlaveConfigurationByPortType, not Speed."},
+       "back: MasterConfiguration must have the one entry SlaveConfigurationByPortType."},
       {"slaves that are no dictionary", "MasterConfiguration", Dictionary{{"SlaveConfigurationByPortType", 1}},
        Code::kWrongType, "back: SlaveConfigurationByPortType must be a dictionary, not the number 1."},
       {"the port of another group", "MasterConfiguration",

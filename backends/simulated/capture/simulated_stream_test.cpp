@@ -1,4 +1,4 @@
-#include "backends/simulated/capture/simulated_stream.h"
+#include "backends/simulated/capture/simulated_capture.h"
 
 #include "backends/simulated/phone_for_tests.h"
 
@@ -60,29 +60,6 @@ TEST_F(SimulatedStreamTest, PropertiesReadTheirDefaultsWithoutControl) {
        "ProjectorErrorCount = 0}"},
   };
   for (const auto& row : kRows) EXPECT_EQ(read(row.key), row.text) << row.key;
-}
-
-TEST_F(SimulatedStreamTest, PropertiesReadBackAsTheyWereSet) {
-  ASSERT_TRUE(user_.control({user_.streams[0]}));
-  const struct {
-    const char* key;
-    Value value;
-  } kRows[] = {
-      {"FormatIndex", 1U},
-      {"FormatIndex", 1},
-      {"MinimumFrameRate", 59.94},
-      {"MinimumFrameRate", 0.001F},
-      {"MaximumFrameRate", 60},
-      {"MultipleOutputSupportEnabled", true},
-      {"MultipleOutputSupportEnabled", false},
-      {"SynchronizedStreamsSlaveConfiguration", slaveConfiguration()},
-      {"SynchronizedStreamsSlaveConfiguration",
-       with(slaveConfiguration(), "MasterToSlaveFrameRateRatio", std::uint64_t{4})},
-  };
-  for (const auto& row : kRows) {
-    EXPECT_EQ(set(row.key, row.value), "done") << row.key;
-    EXPECT_EQ(user_.wide().valueForProperty(row.key, nullptr), row.value) << row.key;
-  }
 }
 
 TEST_F(SimulatedStreamTest, ValuesThatDoNotFitAreRefusedAndChangeNothing) {
@@ -173,31 +150,6 @@ TEST_F(SimulatedStreamTest, AnUnknownPropertyIsNeitherReadNorSet) {
   EXPECT_EQ(set("Colour", 1), expected);
   EXPECT_EQ(outcome([&](DiagnosticErrorPtr* error) { return user_.wide().valueForProperty("Colour", error); }),
             expected);
-}
-
-TEST_F(SimulatedStreamTest, WithoutControlNothingIsSetStartedOrStopped) {
-  const std::string expected = refusal(Code::kNotControlled, "wide is not under control; request control of it first.");
-  EXPECT_EQ(set("FormatIndex", 1), expected);
-  EXPECT_EQ(start(), expected);
-  EXPECT_EQ(stop(), expected);
-}
-
-TEST_F(SimulatedStreamTest, StartsAndStopsInTurn) {
-  ASSERT_TRUE(user_.control({user_.streams[0]}));
-  EXPECT_EQ(stop(), refusal(Code::kWrongState, "wide is not running; it cannot be stopped."));
-  EXPECT_EQ(start(), "done");
-  EXPECT_EQ(start(), refusal(Code::kWrongState, "wide is running already."));
-  EXPECT_EQ(stop(), "done");
-  EXPECT_EQ(stop(), refusal(Code::kWrongState, "wide is not running; it cannot be stopped."));
-  EXPECT_EQ(start(), "done");
-}
-
-TEST_F(SimulatedStreamTest, ARunningStreamTakesNoSettings) {
-  ASSERT_TRUE(user_.control({user_.streams[0]}) && user_.wide().start(nullptr));
-  EXPECT_EQ(set("FormatIndex", 1),
-            refusal(Code::kWrongState, "wide is running; FormatIndex cannot be set until it is stopped."));
-  ASSERT_TRUE(user_.wide().stop(nullptr));
-  EXPECT_EQ(set("FormatIndex", 1), "done");
 }
 
 TEST_F(SimulatedStreamTest, TheMinimumMayBeSetBeforeTheMaximumAndIsJudgedWhenTheStreamStarts) {

@@ -1,4 +1,4 @@
-#include "backends/simulated/capture/property_checks.h"
+#include "backends/capture/property_checks.h"
 
 #include <algorithm>
 #include <array>
@@ -26,6 +26,17 @@ bool isNegative(const Value& value) { return value.signedInteger() != nullptr &&
 constexpr std::array kSlaveSwitches{capture_key::StreamingOutputsEnabled, capture_key::FrameSkippingEnabled,
                                     capture_key::TimeMachineEnabled};
 
+// A camera that only streams along with the master does so at its rate, and skips nothing.
+bool checkStreamsAlong(std::string_view object, const Dictionary& configuration, const Refuser& refuse) {
+  for (const auto& [key, entry] : configuration) {
+    const bool isOn = key == capture_key::StreamingOutputsEnabled || key == capture_key::MasterToSlaveFrameRateRatio;
+    if (toUnsigned(&entry) == (isOn ? 1 : 0)) continue;
+    return refuse(CaptureRefusal::kUnsupported, "%@: %@ can only be %@ here, not %@.", object, key, isOn ? 1 : 0,
+                  described(entry));
+  }
+  return true;
+}
+
 }  // namespace
 
 std::string described(const Value& value) {
@@ -46,67 +57,66 @@ std::string described(const Value& value) {
   return "";
 }
 
-bool checkKnown(CaptureObjectKind kind, std::string_view object, std::string_view key, DiagnosticErrorPtr* error) {
+bool checkKnown(CaptureObjectKind kind, std::string_view object, std::string_view key, const Refuser& refuse) {
   if (findProperty(kind, key) != nullptr) return true;
-  return refuse(error, CaptureErrorCode::kUnknownProperty, "%@ has no property %@; it has %@.", object, key,
-                namesOf(kind));
+  return refuse(CaptureRefusal::kUnknownProperty, "%@ has no property %@; it has %@.", object, key, namesOf(kind));
 }
 
-bool checkWritable(CaptureObjectKind kind, std::string_view object, std::string_view key, DiagnosticErrorPtr* error) {
-  if (!checkKnown(kind, object, key, error)) return false;
+bool checkWritable(CaptureObjectKind kind, std::string_view object, std::string_view key, const Refuser& refuse) {
+  if (!checkKnown(kind, object, key, refuse)) return false;
   if (!findProperty(kind, key)->readOnly) return true;
-  return refuse(error, CaptureErrorCode::kReadOnlyProperty, "%@: %@ can only be read.", object, key);
+  return refuse(CaptureRefusal::kReadOnlyProperty, "%@: %@ can only be read.", object, key);
 }
 
-bool checkBoolean(std::string_view object, std::string_view key, const Value& value, DiagnosticErrorPtr* error) {
+bool checkBoolean(std::string_view object, std::string_view key, const Value& value, const Refuser& refuse) {
   if (value.boolean() != nullptr) return true;
-  return refuse(error, CaptureErrorCode::kWrongType, "%@: %@ must be a boolean, not %@.", object, key,
-                described(value));
+  return refuse(CaptureRefusal::kWrongType, "%@: %@ must be a boolean, not %@.", object, key, described(value));
 }
 
 bool checkIndex(std::string_view object, std::string_view key, const Value& value, std::uint64_t highest,
-                DiagnosticErrorPtr* error) {
+                const Refuser& refuse) {
   if (isInteger(value) && !isNegative(value) && toUnsigned(&value) <= highest) return true;
-  const CaptureErrorCode code = isInteger(value) ? CaptureErrorCode::kOutOfRange : CaptureErrorCode::kWrongType;
-  return refuse(error, code, "%@: %@ must be an integer from 0 to %@, not %@.", object, key, highest, described(value));
+  const CaptureRefusal code = isInteger(value) ? CaptureRefusal::kOutOfRange : CaptureRefusal::kWrongType;
+  return refuse(code, "%@: %@ must be an integer from 0 to %@, not %@.", object, key, highest, described(value));
 }
 
 bool checkRate(std::string_view object, std::string_view key, const Value& value, double highest,
-               DiagnosticErrorPtr* error) {
+               const Refuser& refuse) {
   const bool isNumber = value.isNumber() && value.boolean() == nullptr;
   const double rate = toDouble(&value);
   if (isNumber && rate > 0 && rate <= highest) return true;
-  const CaptureErrorCode code = isNumber ? CaptureErrorCode::kOutOfRange : CaptureErrorCode::kWrongType;
-  return refuse(error, code, "%@: %@ must be a number above 0 and at most %@, not %@.", object, key, highest,
+  const CaptureRefusal code = isNumber ? CaptureRefusal::kOutOfRange : CaptureRefusal::kWrongType;
+  return refuse(code, "%@: %@ must be a number above 0 and at most %@, not %@.", object, key, highest,
                 described(value));
 }
 
-bool checkSlaveConfiguration(std::string_view object, const Value& value, DiagnosticErrorPtr* error) {
+bool checkSlaveConfiguration(std::string_view object, const CameraInfo& camera, const Value& value,
+                             const Refuser& refuse) {
   const Dictionary* entries = value.dictionary();
   if (entries == nullptr) {
-    return refuse(error, CaptureErrorCode::kWrongType, "%@: a slave configuration must be a dictionary, not %@.",
-                  object, described(value));
+    return refuse(CaptureRefusal::kWrongType, "%@: a slave configuration must be a dictionary, not %@.", object,
+                  described(value));
   }
   for (const std::string_view key : kSlaveSwitches) {
     const Value* entry = entries->find(key);
     if (entry == nullptr) {
-      return refuse(error, CaptureErrorCode::kOutOfRange, "%@: a slave configuration must have %@.", object, key);
+      return refuse(CaptureRefusal::kOutOfRange, "%@: a slave configuration must have %@.", object, key);
     }
-    if (!checkBoolean(object, key, *entry, error)) return false;
+    if (!checkBoolean(object, key, *entry, refuse)) return false;
   }
   const Value* ratio = entries->find(capture_key::MasterToSlaveFrameRateRatio);
   if (ratio == nullptr || !isInteger(*ratio) || isNegative(*ratio) || toUnsigned(ratio) == 0) {
     const bool wrongType = ratio != nullptr && !isInteger(*ratio);
-    return refuse(error, wrongType ? CaptureErrorCode::kWrongType : CaptureErrorCode::kOutOfRange,
+    return refuse(wrongType ? CaptureRefusal::kWrongType : CaptureRefusal::kOutOfRange,
                   "%@: a slave configuration must have %@, an integer above 0.", object,
                   capture_key::MasterToSlaveFrameRateRatio);
   }
   for (const auto& [key, entry] : *entries) {
     if (key == capture_key::MasterToSlaveFrameRateRatio) continue;
     if (std::ranges::find(kSlaveSwitches, key) != kSlaveSwitches.end()) continue;
-    return refuse(error, CaptureErrorCode::kOutOfRange, "%@: a slave configuration has no entry %@.", object, key);
+    return refuse(CaptureRefusal::kOutOfRange, "%@: a slave configuration has no entry %@.", object, key);
   }
-  return true;
+  return camera.isSlaveOfAnyConfiguration || checkStreamsAlong(object, *entries, refuse);
 }
 
 }  // namespace quazor
