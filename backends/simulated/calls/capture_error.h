@@ -5,7 +5,9 @@
 #include "contract/diagnostic_error.h"
 
 #include <cstdint>
+#include <string>
 #include <string_view>
+#include <utility>
 
 namespace quazor {
 
@@ -27,6 +29,12 @@ enum class CaptureErrorCode : std::int64_t {
   kForeignObject = 12,       // the stream or group belongs to another device, or to no device
   kInvalidated = 13          // the device has been invalidated
 };
+
+// Stores an error of the service where `error` is not null.
+inline void failSimulatedCapture(DiagnosticErrorPtr* error, CaptureErrorCode code, std::string message) {
+  if (error == nullptr) return;
+  *error = errorWithMessage(SimulatedCaptureErrorDomain, static_cast<std::int64_t>(code), std::move(message), nullptr);
+}
 
 constexpr CaptureErrorCode captureErrorCode(CaptureRefusal reason) {
   switch (reason) {

@@ -30,8 +30,8 @@ std::optional<Dictionary> SimulatedCamera::errorCounters(const CaptureRun* run, 
   std::optional<Dictionary> counters =
       state().errorCounters(own == nullptr ? nullptr : &own->times, hardware_->clock->now());
   if (!counters) {
-    fail(error, SimulatedCaptureErrorDomain, static_cast<std::int64_t>(CaptureErrorCode::kUnreadableProperty), nullptr,
-         "%@: %@ cannot be read.", info_.name, capture_key::ErrorCounters);
+    failSimulatedCapture(error, CaptureErrorCode::kUnreadableProperty,
+                         formatMessage("%@: %@ cannot be read.", info_.name, capture_key::ErrorCounters));
   }
   return counters;
 }

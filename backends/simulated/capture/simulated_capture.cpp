@@ -50,8 +50,7 @@ class SimulatedCaptureBack final : public CaptureBack {
     return hardware_->device.present ? "" : "The phone has no capture device.";
   }
   void storeRefusal(DiagnosticErrorPtr* error, CaptureRefusal reason, std::string message) const override {
-    *error = errorWithMessage(SimulatedCaptureErrorDomain, static_cast<std::int64_t>(captureErrorCode(reason)),
-                              std::move(message), nullptr);
+    failSimulatedCapture(error, captureErrorCode(reason), std::move(message));
   }
   void perform(const CaptureCall& call, DiagnosticErrorPtr* error, const std::function<bool()>& body) const override {
     calls_->perform({call.operation, call.object, call.property}, error, call.detail, body);
