@@ -38,12 +38,12 @@ inline Dictionary hidUsage(Value page, Value usage) {
 }
 
 // UnderTest has:
-//   void connect(std::vector<ConformanceDevice>, std::map<int, ConformanceEvent>): the devices of the system, in their
-//     order, and by number, from 1, the inputs that are not reports. All have feature report 0xAB of two bytes.
+//   void connect(std::vector<ConformanceDevice>, std::map<int, ConformanceEvent>): a new system with these devices, in
+//     their order, and by number, from 1, the inputs that are not reports. All have feature report 0xAB of two bytes.
 //   std::shared_ptr<HidManager> manager()
 //   void arrive(int count): so many inputs come from the only device, which is open. They are numbered from 1 while the
 //     system lives. A report has ID 0x76 and its number, little-endian, in bytes 4 to 7.
-//   RunLoops& runLoops(), Concurrency& concurrency()
+//   RunLoops& runLoops(), Concurrency& concurrency(): also before connect()
 template <class UnderTest>
 class HidConformance : public ::testing::Test {
  protected:
@@ -51,7 +51,6 @@ class HidConformance : public ::testing::Test {
   using Events = std::map<int, ConformanceEvent>;
   static constexpr std::string_view kOtherMode = "org.quazor.other";
 
-  HidConformance() : loop_(*under_test_.runLoops().currentRunLoop()) {}
   ~HidConformance() override { drop(); }
 
   // The only device, with a receiver that writes down what comes: "1" for the report of that number, or "error".
@@ -82,14 +81,15 @@ class HidConformance : public ::testing::Test {
     EXPECT_EQ(devices.size(), 1U);
     return devices.at(0);
   }
-  void schedule(std::string_view mode = kRunLoopDefaultMode) { device_->scheduleWithRunLoop(loop_, mode); }
-  void unschedule(std::string_view mode = kRunLoopDefaultMode) { device_->unscheduleFromRunLoop(loop_, mode); }
+  RunLoop& loop() { return *under_test_.runLoops().currentRunLoop(); }
+  void schedule(std::string_view mode = kRunLoopDefaultMode) { device_->scheduleWithRunLoop(loop(), mode); }
+  void unschedule(std::string_view mode = kRunLoopDefaultMode) { device_->unscheduleFromRunLoop(loop(), mode); }
   RunLoopResult run(std::string_view mode = kRunLoopDefaultMode) {
-    return loop_.runInMode(mode, std::chrono::nanoseconds::zero(), false);
+    return loop().runInMode(mode, std::chrono::nanoseconds::zero(), false);
   }
   // Whether the loop has nothing to wait for.
   bool isIdle(std::string_view mode = kRunLoopDefaultMode) {
-    return loop_.runInMode(mode, std::chrono::milliseconds(1), false) == RunLoopResult::kFinished;
+    return loop().runInMode(mode, std::chrono::milliseconds(1), false) == RunLoopResult::kFinished;
   }
   // The call is made on another thread, which has a loop of its own, and has returned.
   void onOtherThread(const std::function<void(RunLoop&)>& call) {
@@ -129,7 +129,6 @@ class HidConformance : public ::testing::Test {
   }
 
   UnderTest under_test_;
-  RunLoop& loop_;
   Device device_;
   std::vector<std::string> seen_;
   std::function<void()> onInput_;

@@ -1,6 +1,5 @@
 #include "backends/hid/hid_conformance.h"
 #include "backends/simulated/hid/sensor_user_for_tests.h"
-#include "backends/simulated/hid/simulated_hid.h"
 #include "backends/simulated/simulated_phone.h"
 
 #include <chrono>
@@ -8,6 +7,7 @@
 #include <memory>
 #include <optional>
 #include <string>
+#include <utility>
 #include <vector>
 
 namespace quazor {
@@ -18,7 +18,6 @@ class SimulatedHidUnderTest {
  public:
   SimulatedHidUnderTest() { connect({}, {}); }
 
-  // The first phone's loops, clock and queues go on to serve: a fixture keeps its loop.
   void connect(const std::vector<ConformanceDevice>& devices, const std::map<int, ConformanceEvent>& events) {
     std::vector<HidDeviceConfig> sensors;
     for (const ConformanceDevice& device : devices) {
@@ -38,11 +37,9 @@ class SimulatedHidUnderTest {
       }
       sensors.push_back(sensor);
     }
-    if (!phone_) phone_.emplace(sensorScenario({}), PhoneTime::kVirtual, 1);
-    const Platform platform = phone_->platform();
-    hid_ = std::make_shared<SimulatedHidService>(sensors, platform.clock, *platform.concurrency, calls_);
+    phone_.emplace(sensorScenario(std::move(sensors)), PhoneTime::kVirtual, 1);
   }
-  std::shared_ptr<HidManager> manager() { return hid_->createManager(); }
+  std::shared_ptr<HidManager> manager() { return phone_->platform().hid->createManager(); }
   // A moment more than the time between reports, so that what is due then has come.
   void arrive(int count) {
     phone_->platform().clock->sleep(count * std::chrono::milliseconds(10) + std::chrono::microseconds(1));
@@ -52,9 +49,6 @@ class SimulatedHidUnderTest {
 
  private:
   std::optional<SimulatedPhone> phone_;
-  const std::shared_ptr<CallInterceptor> calls_ =
-      std::make_shared<CallInterceptor>(std::vector<Fault>{}, nullptr, nullptr, nullptr);
-  std::shared_ptr<HidService> hid_;
 };
 
 INSTANTIATE_TYPED_TEST_SUITE_P(Simulated, HidConformance, SimulatedHidUnderTest);
