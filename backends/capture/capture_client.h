@@ -39,7 +39,9 @@ struct CaptureGroupSlot {
   Value masterConfiguration{Dictionary{}};
 };
 
-// All users of the service share it. Thread: any, holding `mutex`; what is const needs no lock.
+// All users of the service share it.
+//
+// Thread: any, holding `mutex`; what is const needs no lock.
 struct CaptureSlots {
   explicit CaptureSlots(std::shared_ptr<CaptureBack> cameras);
 
@@ -64,7 +66,9 @@ struct CaptureSlots {
 bool checkStopped(std::string_view object, std::string_view key, const CaptureSlots& slots,
                   const CaptureGroupSlot& group, const Refuser& refuse);
 
-// Holds the mutex while it lives. Thread: one at a time.
+// Holds the mutex while it lives.
+//
+// Thread: one at a time.
 class HeldSlots final {
  public:
   explicit HeldSlots(CaptureSlots& slots) : slots_(slots), lock_(slots.mutex) {}

@@ -1,13 +1,11 @@
 #include "backends/simulated/simulated_phone.h"
 
-#include "backends/capture/property_table.h"
+#include "backends/faults/intercepted_platform.h"
 #include "backends/simulated/calls/injected_error.h"
 #include "backends/simulated/capture/simulated_capture.h"
-#include "backends/simulated/counters/intercepted_reports.h"
 #include "backends/simulated/counters/simulated_reports.h"
 #include "backends/simulated/display/simulated_framebuffer.h"
 #include "backends/simulated/hid/simulated_hid.h"
-#include "backends/simulated/scenario/sensor_operations.h"
 #include "backends/simulated/time/virtual_run_loop.h"
 #include "backends/simulated/time/virtual_services.h"
 #include "backends/threads/real_clock.h"
@@ -23,44 +21,14 @@
 namespace quazor {
 namespace {
 
-// Cannot fail, so faults do not reach it; observers do.
-constexpr std::string_view kClockSleep = "Clock.sleep";
-
-// The phone's clock as plug-ins have it: their sleeps are calls that observers see.
-class ObservedClock final : public Clock {
- public:
-  ObservedClock(std::shared_ptr<Clock> clock, std::shared_ptr<CallInterceptor> calls)
-      : clock_(std::move(clock)), calls_(std::move(calls)) {}
-
-  std::chrono::nanoseconds now() const override { return clock_->now(); }
-  Date date() const override { return clock_->date(); }
-  void sleep(std::chrono::nanoseconds duration) override {
-    clock_->sleep(duration);
-    calls_->report(
-        {kClockSleep, {}, {}}, [&] { return defaultText(std::chrono::duration<double>(duration).count()); }, true);
-  }
-
- private:
-  const std::shared_ptr<Clock> clock_;
-  const std::shared_ptr<CallInterceptor> calls_;
-};
-
-// The phone's run loops as plug-ins have them: a thread may be made to have none.
-class InterceptedRunLoops final : public RunLoops {
- public:
-  InterceptedRunLoops(std::shared_ptr<RunLoops> runLoops, std::shared_ptr<CallInterceptor> calls)
-      : runLoops_(std::move(runLoops)), calls_(std::move(calls)) {}
-
-  RunLoop* currentRunLoop() override {
-    return calls_->perform(
-        {sensor_operation::kCurrentRunLoop, {}, {}}, nullptr, [] { return std::string(); },
-        [this] { return runLoops_->currentRunLoop(); });
-  }
-
- private:
-  const std::shared_ptr<RunLoops> runLoops_;
-  const std::shared_ptr<CallInterceptor> calls_;
-};
+// As the scenario's faults select them; the device has its streams and groups in the scenario's order.
+ObjectNames namesOf(const Scenario& scenario) {
+  ObjectNames names;
+  for (const Camera& camera : scenario.cameras) names.streams.push_back(camera.id);
+  for (const CameraGroup& group : scenario.groups) names.groups.push_back(group.id);
+  names.hidDevice = &SimulatedHidService::nameOf;
+  return names;
+}
 
 }  // namespace
 
@@ -99,13 +67,15 @@ void SimulatedPhone::build(const Scenario& scenario, const std::shared_ptr<Clock
                            CallInterceptor::Hang hang) {
   calls_ = std::make_shared<CallInterceptor>(scenario.faults, clock, std::move(hang), simulatedInjectedError);
   hardware_ = std::make_shared<CaptureHardware>(scenario, clock, concurrency);
-  platform_.capture = makeSimulatedCapture(scenario, hardware_, calls_);
-  platform_.reports = interceptReports(makeSimulatedReports(scenario.reports, hardware_), calls_);
-  platform_.hid = std::make_shared<SimulatedHidService>(scenario.hidDevices, clock, *concurrency, calls_);
-  platform_.framebuffer = std::make_shared<SimulatedFramebufferService>(scenario.display, calls_);
-  platform_.runLoops = std::make_shared<InterceptedRunLoops>(std::move(runLoops), calls_);
-  platform_.clock = std::make_shared<ObservedClock>(clock, calls_);
-  platform_.concurrency = std::move(concurrency);
+  Platform inner;
+  inner.clock = clock;
+  inner.reports = makeSimulatedReports(scenario.reports, hardware_);
+  inner.hid = std::make_shared<SimulatedHidService>(scenario.hidDevices, clock, *concurrency);
+  inner.framebuffer = std::make_shared<SimulatedFramebufferService>(scenario.display);
+  inner.runLoops = std::move(runLoops);
+  inner.concurrency = std::move(concurrency);
+  platform_ = interceptedPlatform(inner, calls_, namesOf(scenario));
+  platform_.capture = makeSimulatedCapture(scenario, hardware_, calls_);  // makes its own calls pass `calls_`
 }
 
 std::vector<FaultStatus> SimulatedPhone::faultStatus() const { return calls_->faultStatus(); }

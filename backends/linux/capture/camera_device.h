@@ -14,7 +14,9 @@
 
 namespace quazor {
 
-// What the cameras of a machine share. Thread: one at a time; what is const, any.
+// What the cameras of a machine share.
+//
+// Thread: one at a time; what is const, any.
 struct LinuxCameras {
   LinuxCameras(std::shared_ptr<V4l2Api> system, DeviceRoots deviceRoots)
       : kernel(std::move(system)), roots(std::move(deviceRoots)) {}

@@ -21,7 +21,9 @@
 
 namespace quazor {
 
-// One stretch of a camera's stream. Thread: any, holding the hardware's mutex.
+// One stretch of a camera's stream.
+//
+// Thread: any, holding the hardware's mutex.
 struct SimulatedRun final : CaptureRun {
   StreamRun times;
   std::shared_ptr<FrameDelivery> delivery;  // null where nothing is delivered, and after the stop

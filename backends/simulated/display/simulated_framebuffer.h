@@ -1,7 +1,6 @@
 // The framebuffer service of the simulated phone.
 #pragma once
 
-#include "backends/faults/call_interceptor.h"
 #include "backends/simulated/scenario/display_config.h"
 #include "platform/framebuffer_service.h"
 
@@ -13,7 +12,7 @@ namespace quazor {
 // Thread: any.
 class SimulatedFramebufferService final : public FramebufferService {
  public:
-  SimulatedFramebufferService(const DisplayConfig& display, std::shared_ptr<CallInterceptor> calls);
+  explicit SimulatedFramebufferService(const DisplayConfig& display);
 
   std::shared_ptr<Display> mainDisplay() override;
 
@@ -22,7 +21,6 @@ class SimulatedFramebufferService final : public FramebufferService {
   class Registry;
 
   const std::shared_ptr<const DisplayConfig> display_;
-  const std::shared_ptr<CallInterceptor> calls_;
 };
 
 }  // namespace quazor

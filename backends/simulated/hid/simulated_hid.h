@@ -1,7 +1,6 @@
 // The HID service of the simulated phone.
 #pragma once
 
-#include "backends/faults/call_interceptor.h"
 #include "backends/simulated/hid/hid_sensor.h"
 #include "backends/simulated/scenario/hid_config.h"
 #include "platform/clock.h"
@@ -9,6 +8,7 @@
 #include "platform/hid.h"
 
 #include <memory>
+#include <string>
 #include <vector>
 
 namespace quazor {
@@ -21,9 +21,11 @@ namespace quazor {
 class SimulatedHidService final : public HidService {
  public:
   SimulatedHidService(const std::vector<HidDeviceConfig>& devices, const std::shared_ptr<Clock>& clock,
-                      Concurrency& concurrency, std::shared_ptr<CallInterceptor> calls);
+                      Concurrency& concurrency);
 
   std::shared_ptr<HidManager> createManager() override;
+  // The scenario's name of a device of such a service; empty for any other device.
+  static std::string nameOf(const HidDevice& device);
 
  private:
   class Device;
@@ -31,7 +33,6 @@ class SimulatedHidService final : public HidService {
   using Sensors = std::vector<std::shared_ptr<HidSensor>>;
 
   const std::shared_ptr<const Sensors> sensors_;
-  const std::shared_ptr<CallInterceptor> calls_;
 };
 
 }  // namespace quazor
