@@ -70,7 +70,8 @@ class StreamingExperiment {
     experiment_ = std::make_shared<QZTesselFaultExperiment>(
         Platform{makeHandMadeCapture(stream_), std::make_shared<RealClock>(), concurrency_,
                  std::make_shared<HandMadeReports>(handMadeChannels(60), 0)});
-    experiment_->setupWithParameters({{"frameCount", stopCount}, {"timeout", 1e9}}, nullptr, nullptr);
+    static_cast<void>(
+        experiment_->setupWithParameters({{"frameCount", stopCount}, {"timeout", 1e9}}, nullptr, nullptr));
     host_ = std::thread([this] { succeeded_ = experiment_->run(nullptr) != nullptr; });
     started_.acquire();
   }

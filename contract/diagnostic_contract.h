@@ -37,10 +37,11 @@ class QUAZOR_EXPORT QZExperiment {
 
   virtual QZDescription experimentDescription() const = 0;
   // Returns the result, owned by the caller, or null on failure.
-  virtual std::unique_ptr<QZExperimentResult> run(DiagnosticErrorPtr* error) = 0;
+  [[nodiscard]] virtual std::unique_ptr<QZExperimentResult> run(DiagnosticErrorPtr* error) = 0;
   // `parameters` contains one number per declared parameter; a missing one reads as 0. `host` may be null. The
   // default implementation ignores the parameters and succeeds.
-  virtual bool setupWithParameters(const Dictionary& parameters, QZDiagnosticHost* host, DiagnosticErrorPtr* error);
+  [[nodiscard]] virtual bool setupWithParameters(const Dictionary& parameters, QZDiagnosticHost* host,
+                                                 DiagnosticErrorPtr* error);
 };
 
 // The optional last operation of an experiment, which inherits this class in addition to QZExperiment.
@@ -49,7 +50,7 @@ class QUAZOR_EXPORT QZTeardown {
  public:
   virtual ~QZTeardown();
 
-  virtual bool teardown(DiagnosticErrorPtr* error) = 0;
+  [[nodiscard]] virtual bool teardown(DiagnosticErrorPtr* error) = 0;
 };
 
 // Turns an experiment's result into measured results with limits.
@@ -63,8 +64,8 @@ class QUAZOR_EXPORT QZAnalysis {
 
   virtual QZDescription analysisDescription() const = 0;
   // Returns the result, owned by the caller, or null on failure.
-  virtual std::unique_ptr<QZAnalysisResult> analyzeExperimentResult(const QZExperimentResult& result,
-                                                                    DiagnosticErrorPtr* error) = 0;
+  [[nodiscard]] virtual std::unique_ptr<QZAnalysisResult> analyzeExperimentResult(const QZExperimentResult& result,
+                                                                                  DiagnosticErrorPtr* error) = 0;
 };
 
 // The optional setup of an analysis, which inherits this class in addition to QZAnalysis.
@@ -74,7 +75,8 @@ class QUAZOR_EXPORT QZAnalysisSetup {
   virtual ~QZAnalysisSetup();
 
   // See QZExperiment::setupWithParameters.
-  virtual bool setupWithParameters(const Dictionary& parameters, QZDiagnosticHost* host, DiagnosticErrorPtr* error) = 0;
+  [[nodiscard]] virtual bool setupWithParameters(const Dictionary& parameters, QZDiagnosticHost* host,
+                                                 DiagnosticErrorPtr* error) = 0;
 };
 
 }  // namespace QUAZOR_CONTRACT

@@ -30,10 +30,10 @@ class QUAZOR_EXPORT CaptureObject : public Object {
   ~CaptureObject() override;
 
   // Returns the property's value, or nothing if it cannot be read or does not exist.
-  virtual std::optional<Value> valueForProperty(std::string_view key, DiagnosticErrorPtr* error) = 0;
+  [[nodiscard]] virtual std::optional<Value> valueForProperty(std::string_view key, DiagnosticErrorPtr* error) = 0;
   // Sets a property. Fails if the property does not exist or is read only, or if the value has the wrong type or is out
   // of range; the property then keeps its value.
-  virtual bool setValue(const Value& value, std::string_view key, DiagnosticErrorPtr* error) = 0;
+  [[nodiscard]] virtual bool setValue(const Value& value, std::string_view key, DiagnosticErrorPtr* error) = 0;
 };
 
 // Thread: one at a time for a device's streams; a frame handler may read properties and call stop() meanwhile.
@@ -42,9 +42,9 @@ class QUAZOR_EXPORT CaptureStream : public CaptureObject {
   ~CaptureStream() override;
 
   // Starts delivering frames. Fails without control of the stream and while the stream runs.
-  virtual bool start(DiagnosticErrorPtr* error) = 0;
+  [[nodiscard]] virtual bool start(DiagnosticErrorPtr* error) = 0;
   // Stops delivering frames. After it returns, no handler is running or will run. Fails if the stream is not running.
-  virtual bool stop(DiagnosticErrorPtr* error) = 0;
+  [[nodiscard]] virtual bool stop(DiagnosticErrorPtr* error) = 0;
 };
 using CaptureStreams = std::vector<std::shared_ptr<CaptureStream>>;
 
@@ -55,7 +55,7 @@ class QUAZOR_EXPORT SynchronizedStreamsGroup : public CaptureObject {
   ~SynchronizedStreamsGroup() override;
 
   // The group's streams, in a fixed order.
-  virtual std::optional<CaptureStreams> streams(DiagnosticErrorPtr* error) = 0;
+  [[nodiscard]] virtual std::optional<CaptureStreams> streams(DiagnosticErrorPtr* error) = 0;
 };
 using SynchronizedStreamsGroups = std::vector<std::shared_ptr<SynchronizedStreamsGroup>>;
 
@@ -65,15 +65,16 @@ class QUAZOR_EXPORT CaptureDevice : public CaptureObject {
   ~CaptureDevice() override;
 
   // The device's streams, in a fixed order.
-  virtual std::optional<CaptureStreams> streams(DiagnosticErrorPtr* error) = 0;
+  [[nodiscard]] virtual std::optional<CaptureStreams> streams(DiagnosticErrorPtr* error) = 0;
   // The groups of streams that can be synchronised, in a fixed order.
-  virtual std::optional<SynchronizedStreamsGroups> synchronizedStreamsGroups(DiagnosticErrorPtr* error) = 0;
+  [[nodiscard]] virtual std::optional<SynchronizedStreamsGroups> synchronizedStreamsGroups(
+      DiagnosticErrorPtr* error) = 0;
   // Acquires control of the streams for this client: all of them or, on failure, none.
-  virtual bool requestControlOfStreams(const CaptureStreams& streams, DiagnosticErrorPtr* error) = 0;
+  [[nodiscard]] virtual bool requestControlOfStreams(const CaptureStreams& streams, DiagnosticErrorPtr* error) = 0;
   // Releases control of the streams.
-  virtual bool relinquishControlOfStreams(const CaptureStreams& streams, DiagnosticErrorPtr* error) = 0;
+  [[nodiscard]] virtual bool relinquishControlOfStreams(const CaptureStreams& streams, DiagnosticErrorPtr* error) = 0;
   // Ends the use of the device: stops its streams and releases their control. Every later call fails.
-  virtual bool invalidate(DiagnosticErrorPtr* error) = 0;
+  [[nodiscard]] virtual bool invalidate(DiagnosticErrorPtr* error) = 0;
 };
 
 // Thread: any.
@@ -82,7 +83,7 @@ class QUAZOR_EXPORT CapturePlugIn : public Object {
   ~CapturePlugIn() override;
 
   // The capture device, or null.
-  virtual std::shared_ptr<CaptureDevice> device(DiagnosticErrorPtr* error) = 0;
+  [[nodiscard]] virtual std::shared_ptr<CaptureDevice> device(DiagnosticErrorPtr* error) = 0;
 };
 
 // Provides the capture plug-in.

@@ -38,13 +38,13 @@ class QUAZOR_EXPORT HidDevice : public Object {
   ~HidDevice() override;
 
   // Opens the device for this client. Fails if the device is already open or was removed.
-  virtual bool open(DiagnosticErrorPtr* error) = 0;
+  [[nodiscard]] virtual bool open(DiagnosticErrorPtr* error) = 0;
   // Replaces the receiver of input reports; an empty one removes it. The receiver may call this itself; it is then
   // destroyed only after it has returned.
   virtual void setInputReportCallback(InputReportCallback callback) = 0;
   // Sends a feature report. `payload` is the whole report, including its ID as the first byte.
-  virtual bool setFeatureReportWithID(std::uint8_t reportID, std::span<const std::uint8_t> payload,
-                                      DiagnosticErrorPtr* error) = 0;
+  [[nodiscard]] virtual bool setFeatureReportWithID(std::uint8_t reportID, std::span<const std::uint8_t> payload,
+                                                    DiagnosticErrorPtr* error) = 0;
   // Delivers input reports and device errors through `runLoop` in this mode from now on. `runLoop` must live until the
   // device is unscheduled from it. While the device is open and not scheduled, reports are lost and errors are kept.
   virtual void scheduleWithRunLoop(RunLoop& runLoop, std::string_view mode) = 0;

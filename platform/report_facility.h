@@ -69,8 +69,8 @@ class QUAZOR_EXPORT ReportSnapshot {
   virtual const std::vector<ReportSample>& samples() const = 0;
   // Returns, for every channel, its value here minus its value in `baseline`, an earlier snapshot of the same set:
   // negative when the counter fell.
-  virtual std::shared_ptr<const ReportSnapshot> snapshotWithBaseline(const ReportSnapshot& baseline,
-                                                                     DiagnosticErrorPtr* error) const = 0;
+  [[nodiscard]] virtual std::shared_ptr<const ReportSnapshot> snapshotWithBaseline(const ReportSnapshot& baseline,
+                                                                                   DiagnosticErrorPtr* error) const = 0;
 };
 
 // A subscription to a set of channels.
@@ -87,7 +87,7 @@ class QUAZOR_EXPORT ReportChannelSet {
   // Returns a new set of the channels for which `keep` returns true. Never null; this set does not change.
   virtual std::shared_ptr<const ReportChannelSet> reportByFilteringChannels(const Predicate& keep) const = 0;
   // Returns the current values, or null.
-  virtual std::shared_ptr<const ReportSnapshot> snapshot(DiagnosticErrorPtr* error) const = 0;
+  [[nodiscard]] virtual std::shared_ptr<const ReportSnapshot> snapshot(DiagnosticErrorPtr* error) const = 0;
 };
 
 // Thread: any.
@@ -99,7 +99,8 @@ class QUAZOR_EXPORT ReportFacility {
   virtual ~ReportFacility();
 
   // All channels of the system that are a single counter, or null.
-  virtual std::shared_ptr<const ReportChannelSet> reportWithOnlySimpleChannels(DiagnosticErrorPtr* error) = 0;
+  [[nodiscard]] virtual std::shared_ptr<const ReportChannelSet> reportWithOnlySimpleChannels(
+      DiagnosticErrorPtr* error) = 0;
 };
 
 }  // namespace QUAZOR_CONTRACT

@@ -144,10 +144,10 @@ TEST_F(InterceptedCaptureTest, ControlIsAskedForTheServicesOwnStreams) {
 
 TEST_F(InterceptedCaptureTest, WhatHasNoNameIsCalledByItsDescription) {
   seen_.clear();
-  streams_[0]->start(nullptr);
-  streams_[1]->start(nullptr);
-  group_->streams(nullptr);
-  device_->requestControlOfStreams(streams_, nullptr);
+  static_cast<void>(streams_[0]->start(nullptr));
+  static_cast<void>(streams_[1]->start(nullptr));
+  static_cast<void>(group_->streams(nullptr));
+  static_cast<void>(device_->requestControlOfStreams(streams_, nullptr));
   EXPECT_THAT(seen_, ElementsAre("wide|", "b|", "back|", "|(wide, b)"));
 }
 
@@ -156,7 +156,7 @@ TEST_F(InterceptedCaptureTest, AGroupKeepsItsStreamsNames) {
   const std::shared_ptr<SynchronizedStreamsGroup> group =
       service_->defaultPlugIn()->device(nullptr)->synchronizedStreamsGroups(nullptr)->front();
   EXPECT_EQ(group, group_);
-  group->streams(nullptr)->back()->stop(nullptr);
+  static_cast<void>(group->streams(nullptr)->back()->stop(nullptr));
   EXPECT_EQ(seen_.back(), "wide|");
 }
 

@@ -61,20 +61,20 @@ TEST(SimulatedPhone, ObserversSeeEveryCallInOrder) {
     const auto device = plugIn->device(nullptr);
     const CaptureStreams streams = *device->streams(nullptr);
     const auto group = device->synchronizedStreamsGroups(nullptr)->front();
-    group->streams(nullptr);
-    device->requestControlOfStreams({streams[0], nullptr}, nullptr);
-    device->requestControlOfStreams({streams[0], streams[1]}, nullptr);
-    group->setValue(Array{streams[0]}, capture_key::ActiveStreams, nullptr);
-    group->valueForProperty(capture_key::SynchronizationMaster, nullptr);
-    device->setValue(7, capture_key::MultiCamConfiguration, nullptr);
-    device->valueForProperty(capture_key::MulticamSessionStatus, nullptr);
-    streams[0]->setValue(1, capture_key::FormatIndex, nullptr);
-    streams[0]->valueForProperty(capture_key::PortType, nullptr);
-    streams[0]->start(nullptr);
+    static_cast<void>(group->streams(nullptr));
+    static_cast<void>(device->requestControlOfStreams({streams[0], nullptr}, nullptr));
+    static_cast<void>(device->requestControlOfStreams({streams[0], streams[1]}, nullptr));
+    static_cast<void>(group->setValue(Array{streams[0]}, capture_key::ActiveStreams, nullptr));
+    static_cast<void>(group->valueForProperty(capture_key::SynchronizationMaster, nullptr));
+    static_cast<void>(device->setValue(7, capture_key::MultiCamConfiguration, nullptr));
+    static_cast<void>(device->valueForProperty(capture_key::MulticamSessionStatus, nullptr));
+    static_cast<void>(streams[0]->setValue(1, capture_key::FormatIndex, nullptr));
+    static_cast<void>(streams[0]->valueForProperty(capture_key::PortType, nullptr));
+    static_cast<void>(streams[0]->start(nullptr));
     platform.clock->sleep(2500ms);
-    streams[0]->stop(nullptr);
-    device->relinquishControlOfStreams({streams[1]}, nullptr);
-    device->invalidate(nullptr);
+    static_cast<void>(streams[0]->stop(nullptr));
+    static_cast<void>(device->relinquishControlOfStreams({streams[1]}, nullptr));
+    static_cast<void>(device->invalidate(nullptr));
   });
   EXPECT_THAT(
       calls,
@@ -159,7 +159,7 @@ TEST(SimulatedPhone, AHangInVirtualTimeEndsTheWait) {
   const PhoneUser user(phone);
   phone.platform().clock->sleep(3s);
   try {
-    user.wide().start(nullptr);
+    static_cast<void>(user.wide().start(nullptr));
     FAIL() << "the call returned";
   } catch (const SimulationStall& stall) {
     EXPECT_STREQ(stall.what(),
@@ -171,7 +171,7 @@ TEST(SimulatedPhone, AHangOnAnotherClockSleepsForEver) {
   SimulatedPhone phone(smallScenario(), std::make_shared<SteppedClock>(), std::make_shared<ThreadConcurrency>());
   const PhoneUser user(phone);
   phone.addFault(fault("CaptureStream.start", FaultAction::kHang));
-  EXPECT_THROW(user.wide().start(nullptr), SteppedClock::NeverEnds);
+  EXPECT_THROW(static_cast<void>(user.wide().start(nullptr)), SteppedClock::NeverEnds);
   EXPECT_EQ(phone.scheduler(), nullptr);
 }
 

@@ -274,6 +274,6 @@ void CameraSession::abandon() {
   relinquish();
 }
 
-void CameraSession::relinquish() { device_->relinquishControlOfStreams(streams_, nullptr); }
+void CameraSession::relinquish() { static_cast<void>(device_->relinquishControlOfStreams(streams_, nullptr)); }
 
 }  // namespace quazor

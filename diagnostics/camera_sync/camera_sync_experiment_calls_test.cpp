@@ -165,7 +165,7 @@ TEST_F(CameraSyncExperimentCalls, FormatIndexesBeyondThePortsAreIgnored) {
 
 TEST_F(CameraSyncExperimentCalls, StreamsAreTakenInTheOrderOfThePorts) {
   device->groups = {makeGroup("shuffled", {super, wide, tele})};
-  device->groups.front()->setValue(wide, capture_key::SynchronizationMaster, nullptr);
+  static_cast<void>(device->groups.front()->setValue(wide, capture_key::SynchronizationMaster, nullptr));
   const std::string text = run({kWidePort, kTelePort, kSuperPort});
   EXPECT_EQ(between(text, "shuffled get streams", "shuffled set ActiveStreams"),
             "shuffled get streams\n"

@@ -338,7 +338,7 @@ TEST_F(NimbeImageExperiment, GivesUpItsObserverWhateverEndsTheRun) {
       if (thrown) throw std::runtime_error("The wait can never end.");
     });
     if (thrown) {
-      EXPECT_THROW(experiment->run(nullptr), std::runtime_error);
+      EXPECT_THROW(static_cast<void>(experiment->run(nullptr)), std::runtime_error);
     } else {
       EXPECT_EQ(experiment->run(nullptr), nullptr);
     }
@@ -356,7 +356,7 @@ TEST_F(NimbeImageExperiment, IsHeldWeaklyByItsObserverAndItsStream) {
     kept = sensor.loop.lastObserver().lock();
     throw std::runtime_error("The wait can never end.");
   });
-  EXPECT_THROW(experiment->run(nullptr), std::runtime_error);
+  EXPECT_THROW(static_cast<void>(experiment->run(nullptr)), std::runtime_error);
   ASSERT_NE(kept, nullptr);
   sensor.loop.addObserver(kept, kRunLoopDefaultMode);
   experiment.reset();

@@ -178,7 +178,8 @@ ProjectorRun runVirtually(const ProjectorPlan& plan, const std::shared_ptr<Virtu
 
   ProjectorRun run;
   run.error = callersOwnError();
-  experiment->setupWithParameters({{"frameCount", plan.stopCount}, {"timeout", plan.timeout}}, nullptr, nullptr);
+  static_cast<void>(
+      experiment->setupWithParameters({{"frameCount", plan.stopCount}, {"timeout", plan.timeout}}, nullptr, nullptr));
   try {
     run.result = experiment->run(&run.error);
     transcript.addCall("Host.release", "host", "", true);

@@ -284,7 +284,7 @@ class Bench {
         });
     EXPECT_TRUE(device.open(nullptr));
     for (const auto& setting : {std::array<std::uint8_t, 2>{0xAB, 1}, std::array<std::uint8_t, 2>{0xAC, 1}}) {
-      device.setFeatureReportWithID(setting.front(), setting, nullptr);
+      static_cast<void>(device.setFeatureReportWithID(setting.front(), setting, nullptr));
     }
     device.scheduleWithRunLoop(rawLoop_, kRunLoopDefaultMode);
     (void)rawLoop_.runInMode(kRunLoopDefaultMode, 15 * request_.period / 10, false);

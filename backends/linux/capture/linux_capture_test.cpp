@@ -122,7 +122,7 @@ TEST(LinuxCaptureTest, InvalidatingStopsAndFreesAllAndRefusesEverythingAfter) {
   EXPECT_EQ(fake.set(fake.wide(), capture_key::FormatIndex, 1), refused);
   const auto next = fake.capture->defaultPlugIn()->device(nullptr);
   EXPECT_TRUE(next->requestControlOfStreams(*next->streams(nullptr), nullptr));
-  next->invalidate(nullptr);
+  static_cast<void>(next->invalidate(nullptr));
   fake.release();
   EXPECT_TRUE(fake.kernel->isIdle());
 }

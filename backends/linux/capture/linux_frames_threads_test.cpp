@@ -189,7 +189,7 @@ TEST(LinuxFramesThreadsTest, WhileOneThreadStopsAHandlerMayInvalidate) {
   fake.prepare(0);
   fake.handle(0, [&](PixelBuffer&, MediaTime) {
     gate.enter();
-    fake.device->invalidate(nullptr);
+    static_cast<void>(fake.device->invalidate(nullptr));
   });
   ASSERT_EQ(fake.start(0), "done");
   fake.kernel->produce(fake.nodes[0]);

@@ -156,7 +156,7 @@ TEST(LinuxStreamTest, AutomaticExposureIsTheControlOfThatName) {
       node.controls = {{V4L2_CID_EXPOSURE_AUTO, "Auto Exposure", 0, 3, usual, V4L2_CTRL_TYPE_MENU}};
       return 0;
     });
-    fake.device->relinquishControlOfStreams({fake.streams[0]}, nullptr);
+    static_cast<void>(fake.device->relinquishControlOfStreams({fake.streams[0]}, nullptr));
     EXPECT_EQ(fake.take(0), "done");
   };
   const auto value = [&] {

@@ -49,7 +49,7 @@ class StreamUser {
     set("VideoOutputHandlers",
         Dictionary{{"PrimaryScaler", Dictionary{{"PixelBufferHandler", frameHandler_}, {"EventHandler", events}}}});
   }
-  ~StreamUser() { user.device->invalidate(nullptr); }
+  ~StreamUser() { static_cast<void>(user.device->invalidate(nullptr)); }
 
   CaptureStream& stream() const { return *user.streams[2]; }
   bool set(std::string_view key, const Value& value) { return stream().setValue(value, key, nullptr); }

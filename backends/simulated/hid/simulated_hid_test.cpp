@@ -59,11 +59,11 @@ TEST_F(SimulatedHidTest, CallsAreObserved) {
   const std::shared_ptr<HidManager> manager = phone_->platform().hid->createManager();
   manager->enumerateDevicesMatching({matchingUsage(65280, 36)});
   const std::shared_ptr<HidDevice> device = manager->devices().front();
-  device->open(nullptr);
-  device->open(nullptr);
+  static_cast<void>(device->open(nullptr));
+  static_cast<void>(device->open(nullptr));
   device->setInputReportCallback([](auto...) {});
   const std::array<std::uint8_t, 2> payload{0xAB, 0x01};
-  device->setFeatureReportWithID(0xAB, payload, nullptr);
+  static_cast<void>(device->setFeatureReportWithID(0xAB, payload, nullptr));
   device->scheduleWithRunLoop(loop, kRunLoopDefaultMode);
   device->setInputReportCallback(nullptr);
   device->unscheduleFromRunLoop(loop, kRunLoopDefaultMode);

@@ -39,12 +39,14 @@ class StreamingExperiment final : public QZExperiment {
     const auto handler = std::make_shared<PixelBufferHandler>([frames](PixelBuffer&, MediaTime) { ++*frames; });
     const std::string output(capture_key::PrimaryScaler);
     const Dictionary handlers{{std::string(capture_key::PixelBufferHandler), handler}};
-    device->requestControlOfStreams(streams, error);
-    streams[0]->setValue(Dictionary{{output, true}}, capture_key::VideoOutputsEnabled, error);
-    streams[0]->setValue(Dictionary{{output, handlers}}, capture_key::VideoOutputHandlers, error);
-    streams[0]->start(error);
+    const bool isStarted =
+        device->requestControlOfStreams(streams, error) &&
+        streams[0]->setValue(Dictionary{{output, true}}, capture_key::VideoOutputsEnabled, error) &&
+        streams[0]->setValue(Dictionary{{output, handlers}}, capture_key::VideoOutputHandlers, error) &&
+        streams[0]->start(error);
+    if (!isStarted) return nullptr;
     while (*frames < wanted_) platform.clock->sleep(std::chrono::milliseconds(5));
-    device->invalidate(error);
+    static_cast<void>(device->invalidate(error));
     auto result = std::make_unique<QZExperimentResult>();
     result->measurements().set("Count",
                                Measurement(static_cast<double>(frames->load()), QZDimensionlessUnit::frames()));
