@@ -1,5 +1,6 @@
 #include "backends/simulated/scenario/scenario.h"
 
+#include "base/json/json_document.h"
 #include "base/text/input_error.h"
 
 #include <gmock/gmock.h>
