@@ -38,6 +38,7 @@ void HidInputDelivery::unschedule(RunLoop& loop, std::string_view mode) {
     const std::lock_guard lock(mutex_);
     const auto found = find(loop, mode);
     if (found == places_.end()) return;
+    // NOLINTNEXTLINE(performance-unnecessary-copy-initialization): the original is erased
     const Scheduled scheduled = *found;
     places_.erase(found);
     onUnscheduled(*scheduled.place);
