@@ -33,7 +33,7 @@ class CompletionTest(unittest.TestCase):
         self.script.write_text(subprocess.run([PROGRAM, "completion", "bash"], capture_output=True, text=True,
                                               check=True).stdout)
         result = subprocess.run(["bash", "-c", BASH, "bash", str(self.script), "quazor", *words], capture_output=True,
-                                text=True, env=self.environment, timeout=60, check=False)
+                                text=True, env=self.environment, timeout=300, check=False)
         return result.stdout.split()
 
     def test_commands(self):

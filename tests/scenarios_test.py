@@ -71,7 +71,7 @@ def compare(command, expectations, fired):
     What is not as expected, as sentences."""
     run = subprocess.run(
         [*command, "--format", "json"],
-        stdout=subprocess.PIPE, stderr=subprocess.PIPE, text=True, timeout=60, check=False)
+        stdout=subprocess.PIPE, stderr=subprocess.PIPE, text=True, timeout=300, check=False)
     if run.returncode not in (0, 1, 2):
         return [f"exit code {run.returncode}: {run.stderr}"]
     report = json.loads(run.stdout)

@@ -98,16 +98,16 @@ class ProcessTest(CommandLineTest):
         self.assertIn("code 7: the stage run of Unruly ended its own process with exit code 3", result.stdout)
 
     def test_a_deadline_ends_what_takes_longer(self):
-        for arguments in (["--deadline", "0.2"], ["--deadline", "run=0.2"], ["--deadline", "60", "--deadline", "run=0.2"]):
+        for arguments in (["--deadline", "1"], ["--deadline", "run=1"], ["--deadline", "60", "--deadline", "run=1"]):
             with self.subTest(arguments):
                 begin = time.monotonic()
                 result = self.run_unruly(3, *arguments)
                 self.assertLess(time.monotonic() - begin, 20)
                 self.assertEqual(result.returncode, 2)
-                self.assertIn("code 8: the stage run of Unruly exceeded its deadline of 0.2 s", result.stdout)
+                self.assertIn("code 8: the stage run of Unruly exceeded its deadline of 1 s", result.stdout)
 
     def test_a_deadline_of_another_stage_is_not_its(self):
-        result = self.run_fake("--realtime", "--deadline", "analyze=0.05", "--deadline", "setup=0.05", duration=0.3)
+        result = self.run_fake("--realtime", "--deadline", "analyze=1", "--deadline", "setup=1", duration=1.2)
         self.assertEqual(result.returncode, 0, result.stdout)
 
     def test_deadlines_that_are_refused(self):
@@ -169,10 +169,14 @@ class ProcessTest(CommandLineTest):
         self.assertEqual(unruly["verdict"], "pass")
 
     def test_it_runs_where_the_ends_of_children_are_ignored(self):
-        begin = time.monotonic()
-        result = self.run_fake(preexec_fn=lambda: signal.signal(signal.SIGCHLD, signal.SIG_IGN))
-        self.assertEqual(result.returncode, 0, result.stdout)
-        self.assertLess(time.monotonic() - begin, 4)
+        # A program that waits for ends of which nobody tells it takes five seconds every time; a busy machine does not.
+        for _ in range(10):
+            begin = time.monotonic()
+            result = self.run_fake(preexec_fn=lambda: signal.signal(signal.SIGCHLD, signal.SIG_IGN))
+            self.assertEqual(result.returncode, 0, result.stdout)
+            if time.monotonic() - begin < 4:
+                return
+        self.fail("every run took four seconds and more")
 
     def test_it_runs_with_few_descriptors(self):
         result = self.run_fake(preexec_fn=lambda: resource.setrlimit(resource.RLIMIT_NOFILE, (64, 64)))
@@ -196,7 +200,7 @@ class InterruptTest(CommandLineTest):
         begin = time.monotonic()
         for one in signals:
             process.send_signal(one)
-        out, err = process.communicate(timeout=30)
+        out, err = process.communicate(timeout=50)
         self.assertLess(time.monotonic() - begin, 20)
         self.assertEqual(process.returncode, 130)
         self.assertIn("interrupted while Fake.One was running", err)
@@ -245,7 +249,7 @@ class InterruptTest(CommandLineTest):
         process = start("run", "Unruly", "Fake.One", "--plugin", UNRULY, "--plugin", WORKING, "--phone", self.phone,
                         "--profile", "none", "--set", "way=12", "--set", "duration=1", "--record", self.record,
                         "--format", "json")
-        out, err = process.communicate(timeout=30)
+        out, err = process.communicate(timeout=50)
         self.assertEqual(process.returncode, 130, err)
         self.assertIn("interrupted while no diagnostic was running", err)
         document = json.loads(out)
@@ -267,7 +271,7 @@ class InterruptTest(CommandLineTest):
         while not children.read_text() and time.monotonic() < limit:
             time.sleep(0.01)
         process.send_signal(signal.SIGINT)
-        out, err = process.communicate(timeout=30)
+        out, err = process.communicate(timeout=50)
         self.assertEqual((process.returncode, out), (130, ""))
         self.assertIn("interrupted while loading the plug-ins", err)
         self.assertFalse(self.record.exists())
@@ -278,7 +282,7 @@ class InterruptTest(CommandLineTest):
         self.addCleanup(process.kill)
         self.assertIn("an error line", process.stderr.readline())
         process.send_signal(signal.SIGINT)
-        out, _ = process.communicate(timeout=30)
+        out, _ = process.communicate(timeout=50)
         self.assertEqual(process.returncode, 0, out)
 
 

@@ -25,9 +25,9 @@ namespace {
 using namespace std::chrono_literals;
 using testing::HasSubstr;
 
-// Waits for the child's end, at most ten seconds.
+// Waits for the child's end, at most a minute.
 std::string endOf(ChildProcess& child) {
-  for (int i = 0; i < 10'000 && !child.end(); ++i) std::this_thread::sleep_for(1ms);
+  for (int i = 0; i < 60'000 && !child.end(); ++i) std::this_thread::sleep_for(1ms);
   return child.end() ? textOf(*child.end()) : "it has not ended";
 }
 
@@ -36,7 +36,7 @@ std::string readAll(int descriptor, std::size_t octets = SIZE_MAX) {
   std::string text;
   while (text.size() < octets) {
     pollfd watched{descriptor, POLLIN, 0};
-    if (::poll(&watched, 1, 10'000) != 1) return text + "... nothing more came";
+    if (::poll(&watched, 1, 60'000) != 1) return text + "... nothing more came";
     char buffer[256];
     const ssize_t count = ::read(descriptor, buffer, std::min(sizeof buffer, octets - text.size()));
     if (count <= 0) break;
@@ -257,7 +257,7 @@ TEST_F(ChildProcessTest, WakesItsParentByItsEnd) {
   ChildProcess child(
       signals_, [](int) {}, std::nullopt);
   pollfd watched{signals_.descriptor(), POLLIN, 0};
-  EXPECT_EQ(::poll(&watched, 1, 10'000), 1);
+  EXPECT_EQ(::poll(&watched, 1, 60'000), 1);
   signals_.drain();
   EXPECT_EQ(signals_.requestsToEnd(), 0);
   EXPECT_EQ(::poll(&watched, 1, 0), 0);

@@ -289,13 +289,17 @@ TEST_F(SupervisionTest, LosesNoTimeWhenItIsAskedAgain) {
     // Two signals of one kind might come as one.
     return ::kill(::getpid(), SIGINT) == 0 && ::kill(::getpid(), SIGTERM) == 0;
   };
-  EXPECT_EQ(run([](int connection) {
-              ::signal(SIGTERM, SIG_IGN);
-              say(connection, "ready\n");
-              hang();
-            }),
-            "interrupted, signal 9 (SIGKILL)");
-  EXPECT_LT(steady_clock::now() - asked, 500ms);
+  // Waiting takes half a second every time; a busy machine does not.
+  for (int attempt = 0; attempt < 20; ++attempt) {
+    ASSERT_EQ(run([](int connection) {
+                ::signal(SIGTERM, SIG_IGN);
+                say(connection, "ready\n");
+                hang();
+              }),
+              "interrupted, signal 9 (SIGKILL)");
+    if (steady_clock::now() - asked < 500ms) return;
+  }
+  FAIL() << "it waited every time";
 }
 
 TEST_F(SupervisionTest, DoesNotWaitForWhatTheChildLeavesBehind) {

@@ -87,7 +87,7 @@ class ProjectorStress : public testing::Test {
       for (std::size_t j = 0; j < kFrames; ++j) buffers_[i][j]->renew(round.frames[i][j]);
     }
     const std::weak_ptr<void> watch = runExperiment(round);
-    for (int i = 0; i < 20'000 && !watch.expired(); ++i) std::this_thread::sleep_for(std::chrono::microseconds(50));
+    for (int i = 0; i < 600'000 && !watch.expired(); ++i) std::this_thread::sleep_for(std::chrono::microseconds(50));
     ASSERT_TRUE(watch.expired()) << "somebody still holds the experiment";
     EXPECT_EQ(calls_.countersRead, 1);
     EXPECT_EQ(calls_.stops, 1);

@@ -19,7 +19,7 @@ import tempfile
 import document_commands
 from document_commands import Problem
 
-TIME_LIMIT = 30  # seconds, for a command
+TIME_LIMIT = 120  # seconds, for a command
 LINES_SHOWN = 20  # of the output of one that ended otherwise than it should
 
 RUN = """#!/bin/sh

@@ -153,7 +153,7 @@ def results_of(program, plugin):
     results = {}
     runs = {"diagnostics": ["run", "--all"], "experiments": ["experiment", "--all", "--plugin", plugin]}
     for kind, command in runs.items():
-        run = subprocess.run([program, *command, "--format", "json"], stdout=subprocess.PIPE, timeout=60, check=True)
+        run = subprocess.run([program, *command, "--format", "json"], stdout=subprocess.PIPE, timeout=300, check=True)
         for one in json.loads(run.stdout)[kind]:
             names = {result["name"] for result in one.get("measuredResults", [])}
             names |= {*one["measurements"], *one["auxiliaryData"]}

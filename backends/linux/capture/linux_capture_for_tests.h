@@ -161,7 +161,7 @@ class SeenFrames {
   // Once there are so many, or after some seconds.
   std::vector<SeenFrame> wait(std::size_t count) {
     std::unique_lock lock(mutex_);
-    changed_.wait_for(lock, std::chrono::seconds(5), [&] { return frames_.size() >= count; });
+    changed_.wait_for(lock, std::chrono::minutes(1), [&] { return frames_.size() >= count; });
     return frames_;
   }
 

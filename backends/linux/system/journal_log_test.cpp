@@ -301,7 +301,7 @@ TEST_F(JournalLogTest, AJournalThatDoesNotReadIsWaitedForOnceAndToldWhatItMissed
   EXPECT_GE(std::chrono::steady_clock::now() - begin, 90ms);
   const auto afterTheFirst = std::chrono::steady_clock::now();
   for (int i = 0; i < 99; ++i) log.write(LogLevel::kError, "s", "c", "dropped at once");
-  EXPECT_LT(std::chrono::steady_clock::now() - afterTheFirst, 1s);
+  EXPECT_LT(std::chrono::steady_clock::now() - afterTheFirst, 99 * 90ms / 4);
   for (int i = 0; i < fillers; ++i) EXPECT_EQ(received(), "filler");
   EXPECT_EQ(received(), "nothing");
   log.write(LogLevel::kDebug, "s", "c", "taken");

@@ -30,11 +30,11 @@ class Gate {
     std::unique_lock lock(mutex_);
     ++came_;
     changed_.notify_all();
-    return changed_.wait_for(lock, 10s, [&] { return came_ >= count; });
+    return changed_.wait_for(lock, 1min, [&] { return came_ >= count; });
   }
   bool pass() {
     std::unique_lock lock(mutex_);
-    return changed_.wait_for(lock, 10s, [&] { return open_; });
+    return changed_.wait_for(lock, 1min, [&] { return open_; });
   }
 
  private:
@@ -57,7 +57,7 @@ class FrameDeliveryOnThreadsTest : public ::testing::Test {
 
   // Waits until all handlers have returned: buffers are given back behind them.
   void settle() {
-    const auto deadline = std::chrono::steady_clock::now() + 10s;
+    const auto deadline = std::chrono::steady_clock::now() + 1min;
     while (!phone_->buffersHeld().empty()) {
       ASSERT_LT(std::chrono::steady_clock::now(), deadline) << "a buffer was never given back";
       std::this_thread::yield();

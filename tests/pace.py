@@ -1,0 +1,13 @@
+"""How fast this machine is just now, for the limits of tests that run beside other work."""
+
+import time
+
+WORK = 0.03  # seconds of processor time
+
+
+def slowdown():
+    """How many times longer work takes now than on an idle machine, at least 1: a short piece of it is timed."""
+    begin, used_before = time.monotonic(), time.thread_time()
+    while time.thread_time() - used_before < WORK:
+        pass
+    return max(1.0, (time.monotonic() - begin) / WORK)
