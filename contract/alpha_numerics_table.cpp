@@ -1,4 +1,4 @@
-// Made by contract/generate_alpha_numerics.py from Unicode's character data; do not edit. To make it anew:
+// Made by contract/generate_alpha_numerics.py from Unicode's character data; do not edit. To regenerate it:
 //   contract/generate_alpha_numerics.py > contract/alpha_numerics_table.cpp
 #include "contract/alpha_numerics_table.h"
 

@@ -18,7 +18,7 @@ SKIPPED = 77
 WIDTH = 120
 
 HEADER = """\
-// Made by contract/generate_alpha_numerics.py from Unicode's character data; do not edit. To make it anew:
+// Made by contract/generate_alpha_numerics.py from Unicode's character data; do not edit. To regenerate it:
 //   contract/generate_alpha_numerics.py > contract/alpha_numerics_table.cpp
 #include "contract/alpha_numerics_table.h"
 
@@ -96,7 +96,7 @@ def main():
         sys.stdout.write(text)
         return 0
     if options.compare.read_text(encoding="ascii") != text:
-        print(f"{options.compare} is not what {options.data} makes; make it anew", file=sys.stderr)
+        print(f"{options.compare} differs from the output for {options.data}; regenerate it", file=sys.stderr)
         return 1
     return 0
 

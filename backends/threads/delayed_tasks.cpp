@@ -22,7 +22,7 @@ void DelayedTasks::clear() {
     tasks.swap(tasks_);
     updateNextDue();
   }
-  // Here they go, outside the lock: whatever their destruction does.
+  // The tasks are destroyed here, outside the lock, because their destructors may do anything.
 }
 
 void DelayedTasks::updateNextDue() {

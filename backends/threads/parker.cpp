@@ -9,7 +9,7 @@
 
 namespace quazor {
 
-// futex(2). The kernel takes the address of the word itself.
+// See futex(2). The kernel needs the address of the atomic's underlying word.
 static_assert(sizeof(std::atomic<std::uint32_t>) == sizeof(std::uint32_t));
 
 void Parker::park(std::chrono::nanoseconds deadline) {

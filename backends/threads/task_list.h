@@ -10,7 +10,8 @@
 //    slot, and its segment stays, until the slot has been published and consumed: a claim needs no other protection.
 // 2. It moves its task there and publishes the slot through the slot's own flag. The consumer takes slots in the order
 //    of the claims, so it waits at a slot that is claimed and not yet published.
-// 3. Whoever claims the last slot of a segment links the next segment and moves the tail there before publishing the
+// 3. The thread that claims the last slot of a segment links the next segment and moves the tail there before
+// publishing the
 //    slot. So the consumer finds a link behind every last slot. Other producers wait for the tail meanwhile.
 // 4. The consumer goes to sleep by setting the asleep bit, and only while the tail is where the consumer is: nothing
 //    is claimed then. The claim that follows clears the bit, and so learns, from the same instruction, that there is

@@ -22,7 +22,7 @@ class ThreadWaiter final : public RunLoopWaiter {
       return;
     for (;;) {
       parker_.prepare();
-      // Whoever changes what `ready` asks for and finds no sleeper did so before `ready` is asked here.
+      // A thread that changes the condition and finds no sleeper did so before `ready` is called here.
       asleep_.store(true);
       if (ready() || (deadline != kNever && now() >= deadline)) break;
       parker_.park(deadline);

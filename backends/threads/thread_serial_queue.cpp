@@ -54,7 +54,7 @@ class ThreadSerialQueue::Worker {
  public:
   // Any thread that holds the queue.
   void post(Task&& task) {
-    // Whoever posts after a delayed task has become due posts that one first.
+    // A thread that posts after a delayed task has become due posts the delayed task first.
     if (delayed_.nextDue() != DelayedTasks::kNever) [[unlikely]]
       postDue();
     push(std::move(task));

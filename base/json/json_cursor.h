@@ -37,7 +37,7 @@ class JsonCursor {
 
   // Of objects. `keys` are all the keys there may be.
   void allowKeys(std::initializer_list<std::string_view> keys) const;
-  // The entry, which must be there.
+  // Returns the entry, which is required: throws if it is missing.
   JsonCursor at(std::string_view key) const;
   // The entry, where it is there.
   std::optional<JsonCursor> find(std::string_view key) const;
@@ -82,8 +82,8 @@ class JsonCursor {
 // `"name"`, as a document has it.
 std::string inQuotes(std::string_view name);
 
-// `; did you mean "near"?` with the nearestName() of `names`, else `; known are "a", "b".`: the end of a sentence about
-// a name that does not exist.
+// `; did you mean "near"?` with the nearestName() of `names`, else `; expected one of "a", "b".`: the end of a sentence
+// about a name that does not exist.
 std::string suggestion(std::string_view name, std::span<const std::string_view> names);
 
 }  // namespace quazor

@@ -12,7 +12,7 @@ namespace {
 
 constexpr std::uint16_t kSafetyDisabledProjection = 0x2000;  // bit 13 of the hardware events
 
-// What an object says of itself when it has nothing better: its class and where it is.
+// The default description of an object: its class and address.
 std::string defaultDescription(const QZTesselFrameDescription* record) {
   char digits[2 * sizeof(std::uintptr_t)];
   const auto end = std::to_chars(digits, digits + sizeof digits, reinterpret_cast<std::uintptr_t>(record), 16).ptr;

@@ -12,14 +12,14 @@ namespace quazor {
 
 // One of the messages that an error comes with.
 struct ExplainedMessage {
-  std::string text;               // "..." stands for what differs from case to case
+  std::string text;               // "..." marks the variable parts
   std::vector<std::string> from;  // the diagnostics and experiments that give it
   std::string meaning;            // empty where the message says it all
 };
 
 // One explanation. An error has a domain and a code, everything else has names.
 struct Explanation {
-  std::string domain;                // empty of what is no error
+  std::string domain;                // empty unless it explains an error
   std::int64_t code = 0;             // of an error
   std::vector<std::string> symbols;  // of an error: its code's names in the source
   std::vector<ExplainedMessage> messages;

@@ -77,7 +77,7 @@ bool isCleanupProcess(std::string_view processName);
 // The system log of this machine: the journal, or syslog(3) if there is no journal.
 std::shared_ptr<LogBackend> systemLogOfThisMachine();
 
-// What a scenario file says of itself. Throws a CommandError (kCannotRead) when the file cannot be read.
+// The summary of a scenario file. Throws a CommandError (kCannotRead) when the file cannot be read.
 ScenarioSummary summaryOfScenario(const std::filesystem::path& file);
 
 }  // namespace quazor

@@ -10,7 +10,7 @@ namespace quazor {
 
 nlohmann::ordered_json eventJson(const RunEvent& event);
 
-// Throws InputError for what is no event.
+// Throws InputError if the JSON is not an event.
 RunEvent eventFrom(const nlohmann::ordered_json& json);
 
 // What is run: name, summary, halves and who uses it.

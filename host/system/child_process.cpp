@@ -134,12 +134,12 @@ WatchedSignals::WatchedSignals() {
   descriptor_ = ::signalfd(-1, &watched, SFD_CLOEXEC | SFD_NONBLOCK);
   if (descriptor_ < 0) refuse("watching for signals");
   ::sigprocmask(SIG_BLOCK, &watched, &before_);
-  // Where the ends of children are ignored, as some programs leave it to those that they start, nobody can wait for
-  // them.
+  // Restores the default for SIGCHLD, because a parent program may have left it ignored, and then waiting for children
+  // fails.
   struct sigaction action {};
   action.sa_handler = SIG_DFL;
   ::sigaction(SIGCHLD, &action, &childrenBefore_);
-  // What a child's children leave behind comes to this process, which ends it.
+  // Orphaned descendants of a child become children of this process, which kills them.
   ::prctl(PR_SET_CHILD_SUBREAPER, 1);
 }
 
@@ -174,7 +174,7 @@ ChildProcess::ChildProcess(const WatchedSignals& signals, const std::function<vo
     doWork(body, becomeChild(parent, signals, connection, output, memory));
     ::_exit(EXIT_SUCCESS);
   }
-  ::setpgid(id_, id_);  // whoever comes first
+  ::setpgid(id_, id_);  // parent and child both call this; the first call takes effect
   ::close(connection.writeEnd);
   ::close(output.writeEnd);
   connection_ = connection.readEnd;

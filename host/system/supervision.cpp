@@ -179,7 +179,7 @@ class Supervisor {
     if (endsByItself_ && child_.end()) how_ = SupervisionEnd::kEnded;
     child_.signalGroup(SIGKILL);
     readAll();
-    // It ended by itself after it had written what is no line; what came then has not been taken.
+    // The child ended by itself after an invalid line; everything after that line is ignored.
     if (isBad_ && how_ == SupervisionEnd::kEnded && !child_.end()->bySignal) how_ = endOfBadConnection();
     if (!output_.rest().empty()) supervision_.takeOutput(output_.rest());
   }

@@ -14,7 +14,7 @@ bool isAllowed(std::string_view character) {
   return character != "\xEF\xBF\xBE" && character != "\xEF\xBF\xBF";
 }
 
-// What stands for the character in XML; empty when it stands for itself.
+// The XML escape of the character; empty if it needs none.
 std::string_view referenceOf(char character, bool inAttribute) {
   switch (character) {
     case '&': return "&amp;";

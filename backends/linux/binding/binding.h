@@ -1,4 +1,4 @@
-// Binding: which of a Linux machine's devices stand for which parts of the phone.
+// Binding: the mapping of a Linux machine's devices to the parts of a phone.
 #pragma once
 
 #include "backends/faults/fault.h"
@@ -92,9 +92,9 @@ struct GroupBinding {
 
 // Files whose numbers are report channels.
 //
-// `path` is absolute; its components may hold the placeholders {group}, {subgroup} and {name}, each at most once, which
-// stand for any text that is not empty, and * for any text (name_pattern.h). A channel's group, subgroup and name are
-// what the placeholders stood for, or else the texts given here. What is known to be no counter (gauges.h) is left out.
+// `path` is absolute; its components may contain the placeholders {group}, {subgroup} and {name}, each at most once,
+// which match any non-empty text, and *, which matches any text (name_pattern.h). A channel's group, subgroup and name
+// are the matched texts, or else the members below. Numbers known not to be counters (gauges.h) are skipped.
 struct CounterFilesBinding {
   std::string path;
   std::optional<std::string> group;
@@ -106,8 +106,8 @@ struct CounterFilesBinding {
 
 // Tracepoints that are counted (perf_event_open), also those of kprobes that were defined in tracefs.
 struct TracepointBinding {
-  std::string system;                   // as "v4l2"; * stands for any text
-  std::string event;                    // as "v4l2_dqbuf"; * stands for any text
+  std::string system;                   // such as "v4l2"; * matches any text
+  std::string event;                    // such as "v4l2_dqbuf"; * matches any text
   std::optional<std::string> group;     // default: "tracepoints"
   std::optional<std::string> subgroup;  // default: the system
   std::optional<std::string> name;      // default: the event

@@ -1,4 +1,4 @@
-// NamePattern: a name with parts that stand for any text.
+// NamePattern: a name with wildcards and placeholders.
 #pragma once
 
 #include <cstddef>
@@ -16,17 +16,18 @@ struct ChannelNames {
   std::optional<std::string> name;
 };
 
-// * stands for any text; the placeholders {group}, {subgroup} and {name} for any text that is not empty. Each stands
-// for as little as lets the whole name match. Case counts, and there is no way to write a * or a brace itself.
+// * matches any text; the placeholders {group}, {subgroup} and {name} match any non-empty text. Each matches as little
+// as possible. Matching is case-sensitive, and * and braces cannot be escaped.
 //
 // Thread: any; it is immutable.
 class NamePattern {
  public:
-  // Throws InputError when the text is not a pattern; what() is the end of a sentence: "holds the unknown placeholder
+  // Throws InputError when the text is not a pattern; what() is the end of a sentence: "contains the unknown
+  // placeholder
   // \"{nmae}\"; ...".
   static NamePattern parse(std::string_view text);
 
-  // Nothing of it stands for any text.
+  // True if the pattern has no wildcards or placeholders.
   bool isLiteral() const { return wildcards_.empty(); }
   bool hasPlaceholder(std::string_view name) const;
   bool matches(std::string_view name) const { return match(name, nullptr); }
@@ -34,7 +35,7 @@ class NamePattern {
   bool match(std::string_view name, ChannelNames* names) const;
 
  private:
-  // What stands for any text, and the text that follows it.
+  // A wildcard or placeholder, and the literal text after it.
   struct Wildcard {
     std::string placeholder;  // without its braces; empty for a *
     std::string after;

@@ -11,7 +11,7 @@
 
 namespace quazor {
 
-// What a dequeued buffer says of itself.
+// The metadata of a dequeued buffer.
 struct DequeuedBuffer {
   std::uint32_t index = 0;
   std::uint32_t bytesUsed = 0;
@@ -20,8 +20,8 @@ struct DequeuedBuffer {
   std::chrono::nanoseconds timestamp{0};  // on the monotonic clock
 };
 
-// Whoever requested buffers of a node keeps others from setting its format until every buffer is unmapped and given
-// back; so release() does all of that whatever fails, and so does the destructor.
+// Requested buffers prevent other processes from setting the node's format until every buffer is unmapped and released.
+// release() and the destructor therefore perform all steps even if one of them fails.
 //
 // Thread: one at a time.
 class CameraBuffers final {

@@ -9,7 +9,7 @@
 
 namespace quazor {
 
-// Channels are looked for anew at every call of reportWithOnlySimpleChannels(); docs/linux.md says which there are.
+// Every call of reportWithOnlySimpleChannels() looks for the channels again; docs/linux.md describes them.
 //
 // A channel whose file has gone, or holds no whole number of at most 64 bits, has no count; differences are those of
 // makeCounterReports(). A tracepoint counts from the first snapshot of a set that it is in; its count there is of the

@@ -1,4 +1,4 @@
-// What a HID device says of itself in its report descriptor (USB HID 1.11, section 6.2.2).
+// The content of a HID device's report descriptor (USB HID 1.11, section 6.2.2).
 #pragma once
 
 #include "backends/hid/hid_matching.h"

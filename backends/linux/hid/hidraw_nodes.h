@@ -20,7 +20,7 @@ struct HidrawRoots {
 struct HidrawNode {
   std::filesystem::path path;    // as "/dev/hidraw0"; the number changes from one connection of the device to the next
   std::string name;              // what the device calls itself; empty when the kernel does not say
-  std::filesystem::path device;  // its directory in sysfs, which is another one after it was connected anew
+  std::filesystem::path device;  // its directory in sysfs, which changes when the device is reconnected
   Bytes rawDescriptor;
   HidReportDescriptor descriptor;  // empty when there is a problem
   std::string problem;             // why its report descriptor says nothing; empty when it does

@@ -63,7 +63,7 @@ class LinuxHidDevice final : public HidDevice {
       failSystemCall(error, "open", name(), number);
       return false;
     }
-    // The path may have come to stand for another device.
+    // The path may now belong to another device.
     const std::filesystem::path opened = hidrawDevice(roots_, node_.path);
     if (opened.empty()) return refuse(error, LinuxErrorCode::kDeviceGone, "has been removed");
     if (opened != node_.device) {

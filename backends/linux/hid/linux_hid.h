@@ -16,7 +16,7 @@ namespace quazor {
 inline constexpr std::chrono::milliseconds kHidAnswerTime{4500};
 
 // All hidraw devices of this machine. A device's usage page and usage are those of the first top-level collection of
-// its report descriptor. Each enumeration looks anew and makes its own objects.
+// its report descriptor. Each enumeration scans again and creates new objects.
 //
 // There is no manager when the kernel has no hidraw. Devices that this user may not use are found too; they say so when
 // they are opened. Input reports and payloads of feature reports begin with the byte of their ID, which is 0 where a

@@ -63,7 +63,7 @@ class DescriptorWaiter final : public RunLoopWaiter {
             ready, [this] { return now(); }, deadline))
       return;
     for (;;) {
-      // Whoever changes what `ready` asks for and finds no sleeper did so before `ready` is asked here.
+      // A thread that changes the condition and finds no sleeper did so before `ready` is called here.
       asleep_.store(true);
       if (ready()) break;
       const std::chrono::nanoseconds left = deadline == kNever ? kNever : deadline - now();

@@ -22,7 +22,7 @@ namespace quazor {
 // does not read and returns success where there is no journal, so that lines could neither be dropped nor go to the
 // fallback.
 //
-// Each line is tried anew, so a journal that is restarted is found again. A journal that has stopped reading costs one
+// Each line tries to connect again, so a restarted journal is found. A journal that has stopped reading costs one
 // line a tenth of a second; from then on lines that it does not take at once are dropped, and their number is told
 // when it takes lines again.
 // Thread: any.

@@ -89,7 +89,7 @@ void guardControlsUntilEnd(const GuardDescriptors& descriptors, const ControlVal
 
 std::unique_ptr<ControlGuard> startProjectorGuard(const std::string& path, const std::vector<ControlValue>& values,
                                                   ControlSetter set, int* number) {
-  // Opened anew: a copy of our descriptor would keep its buffers in use after we have closed it.
+  // Opens the device again: a duplicate of our descriptor would keep its buffers in use after we have closed it.
   const FileDescriptor device(::open(path.c_str(), O_RDWR | O_NONBLOCK | O_CLOEXEC));
   const FileDescriptor guarded(device ? static_cast<int>(::syscall(SYS_pidfd_open, ::getpid(), 0U)) : -1);
   std::array<int, 2> ends{-1, -1};

@@ -92,7 +92,7 @@ std::string fixedText(const Character (&field)[kSize]) {
 
 // Whether the value is in the control's range; buttons and sets of bits have none.
 bool takes(const VideoControl& control, std::int64_t value);
-// A control that is to get a value, for V4l2Api.
+// A control and the value to set, for V4l2Api.
 ControlValue valueFor(const VideoControl& control, std::int64_t value);
 
 // "1/30 s".
