@@ -1,4 +1,4 @@
-// CameraSession: the streams of one camera sync run, and what is done to all of them at once.
+// CameraSession: the streams of one camera sync run, and operations on all of them.
 #pragma once
 
 #include "contract/diagnostic_error.h"
@@ -23,7 +23,7 @@ inline constexpr std::int64_t kNotSynchronized = 214;
 inline constexpr std::int64_t kNoSessionStatus = 215;
 }  // namespace camera_sync_error
 
-// What one camera's session came to. Offset and frames keep the kind of number that the session status held.
+// The session result of one camera. Offset and frames keep the numeric type of the session status.
 struct CameraReport {
   Value offset;
   Value frames;
@@ -34,28 +34,27 @@ struct CameraReport {
 // what fails while a failed run is ended is not. A property that cannot be read counts as absent.
 class CameraSession {
  public:
-  // Finds the first of the device's groups that has a stream for every port, takes control of these streams, and sets
-  // them up to run in lockstep, the first port's stream as the master. Nothing on failure; control that was taken is
-  // then not given back.
+  // Finds the device's first group that has a stream for every port, acquires control of these streams, and configures
+  // them to run in lockstep with the first port's stream as the master. Returns nothing on failure; control that was
+  // acquired is then not released.
   static std::optional<CameraSession> synchronize(std::shared_ptr<CaptureDevice> device,
                                                   const std::vector<std::string>& ports);
 
-  // Sets format and frame rate of every stream, the stream at position i to formatIndexes[i]; stops at the first
-  // failure. A refused format index stores an error, and so does one that is missing; a refused frame rate empties
-  // `error`.
+  // Sets format and frame rate of every stream, using formatIndexes[i] for the stream at position i; stops at the first
+  // failure. A rejected or missing format index stores an error; a rejected frame rate clears `error`.
   bool configure(const Array& formatIndexes, const Value& frameRate, DiagnosticErrorPtr& error);
   // Starts every stream in order; stops at the first failure, which stores an error.
   bool start(DiagnosticErrorPtr& error);
-  // The device's session status. On failure all streams are stopped and control is given back.
+  // Returns the device's session status. On failure it stops all streams and releases control.
   std::optional<Value> status(DiagnosticErrorPtr& error);
-  // Every camera's report, in the order of the ports. Nothing when one could not be had or a frame count was negative;
-  // in the latter case alone `error` is empty.
+  // Returns the report of every camera, in the order of the ports. Returns nothing if one is unavailable, or if a frame
+  // count is negative; only in the latter case `error` is empty.
   std::optional<std::vector<CameraReport>> reports(const Value& status, DiagnosticErrorPtr& error);
-  // Stops every stream, last one first, then gives control back. Failures are logged and change nothing.
+  // Stops every stream in reverse order, then releases control. Failures are only logged.
   void finish();
-  // As finish(), for a failed run: what fails here is not even logged.
+  // Like finish(), for a failed run: failures are not logged.
   void abandon();
-  // Gives control of the streams back; a failure is not told.
+  // Releases control of the streams. Failures are ignored.
   void relinquish();
 
  private:

@@ -9,18 +9,18 @@
 
 namespace quazor {
 
-// Per camera it gives the frame offset, the frame count and their sum, in this order.
+// Returns the frame offset, the frame count and their sum for each camera, in this order.
 // Thread: the host's, as QZAnalysis.
 class QZCameraSyncAnalysis final : public QZAnalysis {
  public:
-  // `ports` are port types; one without a camera name is left out.
+  // `ports` are port types; ports without a camera name are omitted.
   explicit QZCameraSyncAnalysis(const std::vector<std::string>& ports);
 
-  // The names of the cameras it expects, in the order of their ports.
+  // The names of the expected cameras, in the order of their ports.
   const std::vector<std::string>& cameras() const { return _cameras; }
 
   QZDescription analysisDescription() const override;
-  // Fails with QZErrorDomain code 6 at the first measurement that is missing.
+  // Fails with QZErrorDomain code 6 at the first missing measurement.
   std::unique_ptr<QZAnalysisResult> analyzeExperimentResult(const QZExperimentResult& result,
                                                             DiagnosticErrorPtr* error) override;
 

@@ -12,8 +12,8 @@ namespace quazor {
 
 class CameraSession;
 
-// The result holds, per port that has a camera name (diagnostics/camera_sync/camera_names.h), the measurements
-// CAMERA.FrameOffset and CAMERA.Frames, and under the auxiliary data's ErrorCounters what the stream counted.
+// For each port with a camera name (diagnostics/camera_sync/camera_names.h), the result contains the measurements
+// CAMERA.FrameOffset and CAMERA.Frames, and the stream's counters in the auxiliary data ErrorCounters.
 // Thread: the host's, as QZExperiment.
 class QZCameraSyncExperiment final : public QZExperiment {
  public:
@@ -30,7 +30,7 @@ class QZCameraSyncExperiment final : public QZExperiment {
   void setFrameRate(Value frameRate) { _frameRate = std::move(frameRate); }
 
   QZDescription experimentDescription() const override;
-  // Takes "duration", the streaming time in seconds; fails with QZErrorDomain code 5 when it is less than 2.
+  // Parameter: "duration", the streaming time in seconds. Fails with QZErrorDomain code 5 if it is less than 2.
   bool setupWithParameters(const Dictionary& parameters, QZDiagnosticHost* host, DiagnosticErrorPtr* error) override;
   // Blocks for the duration. Fails with the codes of diagnostics/camera_sync/camera_session.h; after a refused frame
   // rate, and when a camera's frame count is negative, it returns null and empties `error`.

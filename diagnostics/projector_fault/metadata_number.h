@@ -1,4 +1,4 @@
-// MetadataNumber: a number of a frame's metadata, or none, in as few bytes as it needs.
+// MetadataNumber: an optional number from a frame's metadata, stored compactly.
 #pragma once
 
 #include "contract/value.h"
@@ -9,12 +9,12 @@
 
 namespace quazor {
 
-// Holds a number of any kind that a Value can be, and gives it back as that kind. A Value that is no number counts as
-// none. Copies and goes like a plain integer, which a Value does not.
+// Stores a number of any numeric type of Value and returns it with that type. A Value that is not a number is stored as
+// no number. Trivial to copy and destroy, unlike a Value.
 // Thread: one at a time; any number may read while none writes.
 class MetadataNumber {
  public:
-  // Nothing is copied but the number itself: a frame has many, and a million frames a second may come.
+  // Copies only the number, because a frame has many and up to a million frames may arrive per second.
   void assign(const Value& value) {
     switch (value.kind()) {
       case Value::Kind::kBoolean: number_ = *value.boolean(); break;

@@ -1,4 +1,4 @@
-// RecordPool: memory for records that one thread makes and another one drops, all of one size.
+// RecordPool: memory for records of one size that one thread creates and another destroys.
 #pragma once
 
 #include <atomic>
@@ -8,23 +8,23 @@
 
 namespace quazor {
 
-// General allocators hand a block back to the heap of the thread that asked for it, so two threads that do this for
-// every frame wait for each other. Here a dropped block goes to a list that the maker takes over as a whole when its
-// own is empty.
+// General allocators return a block to the heap of the thread that allocated it, so two threads that do this for every
+// frame contend for it. Here a released block goes to a list, which the allocating thread takes over as a whole when
+// its own list is empty.
 //
-// Blocks are kept until the pool is destroyed: as many as were in use at one time.
+// The pool keeps its blocks until it is destroyed; their number is the maximum in use at one time.
 // Thread: one at a time for take(); any for give().
 class RecordPool {
  public:
   RecordPool() = default;
   RecordPool(const RecordPool&) = delete;
   RecordPool& operator=(const RecordPool&) = delete;
-  // REQUIRES: all blocks have been given back.
+  // REQUIRES: all blocks have been released.
   ~RecordPool();
 
   // A block of `size` bytes, aligned for any ordinary object. Thread: one at a time.
   void* take(std::size_t size);
-  // Gives a block of take() back. Thread: any.
+  // Releases a block returned by take(). Thread: any.
   void give(void* block) noexcept;
 
  private:
@@ -35,8 +35,8 @@ class RecordPool {
   static void destroy(Free* list);
 
   std::size_t size_ = 0;               // of every block; set by the first take
-  Free* own_ = nullptr;                // of the thread that takes
-  std::atomic<Free*> given_{nullptr};  // given back since `own_` was filled
+  Free* own_ = nullptr;                // free blocks of the allocating thread
+  std::atomic<Free*> given_{nullptr};  // blocks released since `own_` was filled
 };
 
 // For std::allocate_shared; the pool, which serves one type, must outlive every object in it.

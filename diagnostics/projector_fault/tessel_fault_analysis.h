@@ -10,22 +10,22 @@
 
 namespace quazor {
 
-// How many lit frames are asked for: a parameter of the experiment and of the analysis.
+// The required number of lit frames: a parameter of the experiment and of the analysis.
 inline constexpr std::string_view kFrameCountParameter = "frameCount";
 
-// Gives a result per expected report channel, limited to 0, the frame count with its minimum, and the I2C, MIPI and
-// SIF errors, limited to 0. The LPDP, UART and projector errors are for the record and not judged.
+// Returns one result per expected report channel, limited to 0, the frame count with its minimum, and the I2C, MIPI and
+// SIF errors, limited to 0. The LPDP, UART and projector errors are informational.
 // Thread: the host's, as QZAnalysis.
 class QZTesselFaultAnalysis final : public QZAnalysis, public QZAnalysisSetup {
  public:
-  // The number of frames that the run must have delivered at least; absent, it counts as 0.
+  // The minimum number of frames that the run must have delivered; 0 if absent.
   const std::optional<Value>& frameCount() const { return _frameCount; }
   void setFrameCount(std::optional<Value> count) { _frameCount = std::move(count); }
 
   QZDescription analysisDescription() const override;
-  // Takes "frameCount" as it stands. Never fails.
+  // Parameter: "frameCount", used without checks. Never fails.
   bool setupWithParameters(const Dictionary& parameters, QZDiagnosticHost* host, DiagnosticErrorPtr* error) override;
-  // Fails with QZErrorDomain code 6 at the first measurement that is missing.
+  // Fails with QZErrorDomain code 6 at the first missing measurement.
   std::unique_ptr<QZAnalysisResult> analyzeExperimentResult(const QZExperimentResult& result,
                                                             DiagnosticErrorPtr* error) override;
 

@@ -15,12 +15,12 @@
 
 namespace quazor {
 
-// Counts the frames that arrive, checks that each one was lit, and ends with the first lit frame whose number is at
-// least the number asked for, with the first frame that fails, or at the timeout. The result holds the frame count,
-// the stream's error counters, and by how much every fault channel counted up meanwhile.
+// Counts the arriving frames, checks that each one was lit, and ends at the first lit frame whose number is at least
+// the required number, at the first frame that fails, or at the timeout. The result contains the frame count, the
+// stream's error counters, and the increase of every fault channel.
 //
-// Must be owned by a std::shared_ptr: its stream's handlers hold it weakly, its tasks in part strongly. The last
-// reference may go on any thread, one of its own queues' included.
+// Must be owned by a std::shared_ptr: its stream's handlers hold it weakly, some of its tasks strongly. The last
+// reference may be released on any thread, including a thread of its own queues.
 //
 // Thread: the host's calls come on the host's thread. Frames and events come on the capture service's threads and are
 // taken in on the receiving queue, where they are counted; lit or not is found out on the processing queue, where
@@ -29,7 +29,7 @@ class QZTesselFaultExperiment final : public QZExperiment,
                                       public QZTeardown,
                                       public std::enable_shared_from_this<QZTesselFaultExperiment> {
  public:
-  // For the stream of the front infrared camera, or of another capture port.
+  // Uses the stream of the front infrared camera, or of another capture port.
   explicit QZTesselFaultExperiment(Platform platform = installedPlatform());
   explicit QZTesselFaultExperiment(std::string port, Platform platform = installedPlatform());
 
@@ -43,10 +43,10 @@ class QZTesselFaultExperiment final : public QZExperiment,
   void setStream(std::shared_ptr<CaptureStream> stream) { _stream = std::move(stream); }
 
   QZDescription experimentDescription() const override;
-  // Takes "frameCount" and "timeout", in seconds; fails with QZErrorDomain code 5 when one is negative.
+  // Parameters: "frameCount", and "timeout" in seconds. Fails with QZErrorDomain code 5 if one is negative.
   bool setupWithParameters(const Dictionary& parameters, QZDiagnosticHost* host, DiagnosticErrorPtr* error) override;
   // Blocks until the stream has ended. Fails with codes of QZCapturePlugInErrorDomain, and with QZTelemonErrorDomain
-  // code 100. May store an error and succeed all the same.
+  // code 100. May store an error and still succeed.
   std::unique_ptr<QZExperimentResult> run(DiagnosticErrorPtr* error) override;
   // Invalidates the capture device; fails with QZCapturePlugInErrorDomain code 200.
   bool teardown(DiagnosticErrorPtr* error) override;
@@ -65,7 +65,7 @@ class QZTesselFaultExperiment final : public QZExperiment,
                                               DiagnosticErrorPtr* error);
   std::unique_ptr<QZExperimentResult> _buildResult() const;
 
-  // Any thread. Takes over the caller's reference to the buffer, and gives it back only when the frame is handed on to
+  // Any thread. Takes over the caller's reference to the buffer, and releases it only when the frame is passed on to
   // the processing queue.
   void _handlePixelBuffer(PixelBuffer& buffer, MediaTime time);
   // Any thread.

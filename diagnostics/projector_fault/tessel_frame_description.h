@@ -23,12 +23,11 @@ namespace quazor {
 // Thread: one while it is being filled; any may read it afterwards.
 class QZTesselFrameDescription final : public Object {
  public:
-  // A number of the metadata; absent where it was set to nothing or to what is no number, floodActiveTemperature also
-  // where it was never set.
+  // A number from the metadata; absent if it was set to nothing or to a value that is not a number.
+  // floodActiveTemperature is also absent if it was never set.
   using Number = std::optional<Value>;
 
-  // A record of defaults: number 0, time 0, made now, floodActiveTemperature absent and all other numbers the integer
-  // 0.
+  // A default record: number 0, time 0, created now, floodActiveTemperature absent, all other numbers the integer 0.
   explicit QZTesselFrameDescription(const Clock& clock = *installedPlatform().clock);
 
   // For the functions below: a record without numbers, which fill() gives it.
@@ -38,8 +37,8 @@ class QZTesselFrameDescription final : public Object {
   };
   QZTesselFrameDescription(const Clock& clock, Unfilled);
 
-  // The record of a frame, or null when a number of the metadata is missing or is no number; floodActiveTemperature
-  // alone may be missing.
+  // The record of a frame, or null if a value in the metadata is missing or not a number; only floodActiveTemperature
+  // may be missing.
   static std::shared_ptr<const QZTesselFrameDescription> descriptionWithMonotonicCount(
       std::uint64_t monotonicCount, MediaTime presenationTime, const Dictionary& metadata,
       const Clock& clock = *installedPlatform().clock);
@@ -60,7 +59,7 @@ class QZTesselFrameDescription final : public Object {
 
   Number projectorMode() const { return _numbers[kProjectorMode].value(); }
   void setProjectorMode(const Number& number) { set(kProjectorMode, number); }
-  // The light source that lit the frame: 1 or 2 when one did.
+  // The light source that lit the frame: 1 or 2 if one did.
   Number infraredLightSource() const { return _numbers[kInfraredLightSource].value(); }
   void setInfraredLightSource(const Number& number) { set(kInfraredLightSource, number); }
   Number projectorIndex() const { return _numbers[kProjectorIndex].value(); }
@@ -102,7 +101,7 @@ class QZTesselFrameDescription final : public Object {
   static std::string csvRepresentationHeader();
   // The CSV line, 21 fields and a newline.
   std::string csvRepresentation() const;
-  // True when the module kept its projector dark for safety.
+  // True if the module kept its projector off for safety.
   bool safetyDisabledProjection() const;
 
  private:

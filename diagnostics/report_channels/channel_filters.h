@@ -1,4 +1,4 @@
-// Which report channels the diagnostics look at.
+// Filters for the report channels that the diagnostics use.
 #pragma once
 
 #include "platform/report_facility.h"
@@ -9,8 +9,8 @@ namespace quazor {
 // "K42ISP Events".
 bool isInPresenceReport(const ReportChannelDescription& channel);
 
-// The channels whose subgroup is exactly "K42ISP Events", in whatever group. On purpose narrower than the presence
-// report in the subgroup, and wider in the group.
+// The channels whose subgroup is exactly "K42ISP Events", in any group. Deliberately stricter on the subgroup than the
+// presence report, and less strict on the group.
 bool isInFaultReport(const ReportChannelDescription& channel);
 
 }  // namespace quazor

@@ -1,4 +1,4 @@
-// The report channels that a sound depth camera module publishes.
+// The report channels that a good depth camera module publishes.
 #pragma once
 
 #include <string_view>

@@ -1,4 +1,4 @@
-// QZTesselTelemonAnalysis: every expected channel of the depth camera module must be there, and count nothing.
+// QZTesselTelemonAnalysis: requires every expected channel of the depth camera module to be present and 0.
 #pragma once
 
 #include "contract/diagnostic_contract.h"
@@ -7,8 +7,8 @@
 
 namespace quazor {
 
-// Gives one result per expected name, in the order of expectedTelemonNames(), limited to 0; other measurements are
-// left alone.
+// Returns one result per expected name, in the order of expectedTelemonNames(), limited to 0. Ignores other
+// measurements.
 // Thread: the host's, as QZAnalysis.
 class QZTesselTelemonAnalysis final : public QZAnalysis {
  public:

@@ -8,8 +8,8 @@
 
 namespace quazor {
 
-// The result holds one measurement per channel, its count in events under the channel's name; of two channels with one
-// name the later one stands. No channels give an empty result.
+// The result contains one measurement per channel: its count, in events, under the channel's name. If two channels have
+// the same name, the later one is kept. Without channels the result is empty.
 // Thread: the host's, as QZExperiment.
 class QZTesselTelemonExperiment final : public QZExperiment {
  public:

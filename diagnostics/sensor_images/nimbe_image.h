@@ -1,4 +1,4 @@
-// One scan image of the display sensor: the raw record that the sensor sends, and the values that are read from it.
+// One scan image of the display sensor: the raw record sent by the sensor, and the values parsed from it.
 #pragma once
 
 #include "contract/value.h"
@@ -32,13 +32,13 @@ inline constexpr std::size_t kNimbeImageRecordSize = 792;
 inline constexpr std::size_t kNimbeScanSize = 48;
 using NimbeImageRecord = std::array<std::uint8_t, kNimbeImageRecordSize>;
 
-// The values of one record. The samples are kept as plain numbers; they become Values when they are asked for.
+// The values of one record. The samples are stored as plain numbers and converted to Values on demand.
 // Thread: one at a time; any number may read while none writes.
 class QZNimbeCorvaneImage {
  public:
-  // Of a record whose bytes after the report ID are all zero.
+  // The image of a record whose bytes after the report ID are all zero.
   QZNimbeCorvaneImage();
-  // Keeps no reference to the record.
+  // Parses a record without keeping a reference to it.
   explicit QZNimbeCorvaneImage(std::span<const std::uint8_t, kNimbeImageRecordSize> record);
 
   // An unsigned number.
@@ -57,7 +57,7 @@ class QZNimbeCorvaneImage {
   void setTimestampInMilliseconds(Value timestamp) { _timestampInMilliseconds = std::move(timestamp); }
 
  private:
-  // The samples of one channel, or the array that was put in their place.
+  // The samples of one channel, or the array that replaced them.
   class Scan {
    public:
     explicit Scan(std::span<const std::uint8_t, 4 * kNimbeScanSize> bytes);

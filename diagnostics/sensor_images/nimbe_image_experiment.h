@@ -13,8 +13,8 @@
 
 namespace quazor {
 
-// Streams the sensor on the calling thread's run loop until the images asked for have arrived, the device fails or the
-// time is up. The result's auxiliary data holds under "images" a dictionary per image, in the order of their arrival:
+// Streams the sensor on the calling thread's run loop until the requested images have arrived, the device fails or the
+// timeout expires. The entry "images" of the auxiliary data has one dictionary per image, in the order of arrival:
 // "frameID", "dScanI", "dScanQ", "tmonDataInC" and "timestampInMilliseconds".
 //
 // Must be owned by a std::shared_ptr: the stream and the loop's observer hold it weakly.
@@ -25,19 +25,19 @@ class QZNimbeImageExperiment final : public QZExperiment,
                                      public QZNimbeImageStreamDelegate,
                                      public std::enable_shared_from_this<QZNimbeImageExperiment> {
  public:
-  // Makes the stream of a run; may answer null.
+  // Creates the stream of a run; may return null.
   using StreamFactory = std::function<std::shared_ptr<QZNimbeImageStream>(const Platform& platform)>;
 
   explicit QZNimbeImageExperiment(Platform platform = installedPlatform());
   QZNimbeImageExperiment(Platform platform, StreamFactory makeStream);
 
   QZDescription experimentDescription() const override;
-  // Takes "images", the number to capture, and "timeout", in seconds. Fails with codes 1 and 2 of
+  // Parameters: "images", the number to capture, and "timeout", in seconds. Fails with codes 1 and 2 of
   // QZNimbeImageExperimentErrorDomain.
   bool setupWithParameters(const Dictionary& parameters, QZDiagnosticHost* host, DiagnosticErrorPtr* error) override;
-  // Blocks for as long as the timeout at most. May return more images than were asked for, and fewer when the loop has
-  // nothing left to wait for. Fails with codes 1 and 3 to 6 of QZNimbeImageExperimentErrorDomain, and with the error
-  // of a device that fails while it streams. Throws std::logic_error when the system has no HID manager.
+  // Blocks at most until the timeout. May return more images than requested, or fewer if the loop has no sources left.
+  // Fails with codes 1 and 3 to 6 of QZNimbeImageExperimentErrorDomain, or with the error of a device that fails while
+  // streaming. Throws std::logic_error if the system has no HID manager.
   std::unique_ptr<QZExperimentResult> run(DiagnosticErrorPtr* error) override;
 
   void handleImage(std::shared_ptr<QZNimbeCorvaneImage> image) override;
@@ -55,8 +55,8 @@ class QZNimbeImageExperiment final : public QZExperiment,
   std::vector<std::shared_ptr<QZNimbeCorvaneImage>> _images;
   std::uint64_t _imagesToCapture = 0;
   std::uint64_t _timeoutInSeconds = 0;
-  std::shared_ptr<Semaphore> _done_seamphore;  // nothing signals it and nothing waits on it
-  DiagnosticErrorPtr _asyncError;              // what the stream failed with
+  std::shared_ptr<Semaphore> _done_seamphore;  // never signalled and never waited for
+  DiagnosticErrorPtr _asyncError;              // the error of a failed stream
   RunLoop* _runLoop = nullptr;                 // not owned
 };
 

@@ -1,4 +1,4 @@
-// QZNimbeImageStream: finds the display sensor among the HID devices, switches it to streaming, and hands on its
+// QZNimbeImageStream: finds the display sensor among the HID devices, switches it to streaming, and delivers its
 // images.
 #pragma once
 
@@ -13,7 +13,7 @@
 
 namespace quazor {
 
-// Receives what a stream has to tell, on the thread that runs the stream's loop.
+// Receives the images and errors of a stream, on the thread that runs the stream's loop.
 // Thread: that of the stream's run loop.
 class QZNimbeImageStreamDelegate {
  public:
@@ -23,11 +23,11 @@ class QZNimbeImageStreamDelegate {
   virtual ~QZNimbeImageStreamDelegate();
 
   virtual void handleImage(std::shared_ptr<QZNimbeCorvaneImage> image) = 0;
-  // The device has failed; the stream is closed already.
+  // Called when the device has failed; the stream is already closed.
   virtual void streamDidError(DiagnosticErrorPtr error) = 0;
 };
 
-// Must be owned by a std::shared_ptr: the device's callback holds it weakly, so it may go while the device stays.
+// Must be owned by a std::shared_ptr: the device's callback holds it weakly, so it may be destroyed before the device.
 //
 // Thread: that of the run loop which it is opened with. Reports come there while the loop runs, and the delegate is
 //   called from inside them. It may close the stream, replace itself or drop the stream then.
@@ -35,22 +35,22 @@ class QZNimbeImageStream final : public std::enable_shared_from_this<QZNimbeImag
  public:
   explicit QZNimbeImageStream(Platform platform = installedPlatform());
 
-  // Held weakly; without one, images are dropped.
+  // The delegate, held weakly; without one, images are dropped.
   std::shared_ptr<QZNimbeImageStreamDelegate> delegate() const { return _delegate.lock(); }
   void setDelegate(std::weak_ptr<QZNimbeImageStreamDelegate> delegate) { _delegate = std::move(delegate); }
 
-  // Opens the one sensor, switches it to active power and to images only, and schedules it on the loop, which must
-  // live until close(). Fails with codes 3, 4 and 5 of QZNimbeImageExperimentErrorDomain; a device that was opened
-  // until then is left as it is. Throws std::logic_error when the system has no HID manager.
+  // Opens the only matching sensor, switches it to active power and to images only, and schedules it on the loop, which
+  // must live until close(). Fails with codes 3, 4 and 5 of QZNimbeImageExperimentErrorDomain; a device that is already
+  // open then stays open. Throws std::logic_error if the system has no HID manager.
   bool openWithRunLoop(RunLoop& runLoop, DiagnosticErrorPtr* error);
 
-  // Stops the delivery and closes the device, which stays referenced. Harmless when it is not open.
+  // Stops delivery and closes the device, which stays referenced. No effect if it is not open.
   void close();
 
  private:
   bool _findDevice(DiagnosticErrorPtr* error);
   bool _startDevice(DiagnosticErrorPtr* error);
-  // The error is a copy of its own: what the callback was given goes when the stream is closed.
+  // Copies the error, because closing the stream destroys the callback's argument.
   void processInputReportWithID(std::uint8_t reportID, std::span<const std::uint8_t> data, DiagnosticErrorPtr error);
 
   Platform _platform;
