@@ -73,13 +73,13 @@ Selectable selectableProperties(const Names& operations, const FaultTargets& tar
 
 std::string readObject(const JsonCursor& cursor, const std::string& operation, const Selectable& objects) {
   if (objects.isEmpty()) {
-    cursor.fail(operation + " is not called on a camera, a group or a HID device; leave it out.");
+    cursor.fail(operation + " has no object; remove this key.");
   }
   return objects.any ? cursor.text() : cursor.oneOf(objects.names, "an object of " + operation);
 }
 
 std::string readProperty(const JsonCursor& cursor, const std::string& operation, const Selectable& properties) {
-  if (properties.isEmpty()) cursor.fail(operation + " is about no property; leave it out.");
+  if (properties.isEmpty()) cursor.fail(operation + " has no property; remove this key.");
   if (!properties.any && !properties.anyReport) return cursor.oneOf(properties.names, "a property of " + operation);
   std::string name = cursor.text();
   if (properties.any || hidReportNamed(name)) return name;
@@ -115,13 +115,13 @@ Fault readFault(const JsonCursor& cursor, const FaultTargets& targets) {
   fault.action = *std::ranges::find(kActions, name, &faultActionName);
 
   if (const auto error = cursor.find("error")) {
-    if (fault.action != FaultAction::kFail) error->fail("only the action \"fail\" has an error.");
+    if (fault.action != FaultAction::kFail) error->fail("only the action \"fail\" can have an error.");
     fault.error = readFaultError(*error);
   }
   if (fault.action == FaultAction::kDelay) {
     fault.seconds = cursor.at("seconds").positiveNumber(kMaxDelay);
   } else if (const auto seconds = cursor.find("seconds")) {
-    seconds->fail("only the action \"delay\" has seconds.");
+    seconds->fail("only the action \"delay\" can have seconds.");
   }
   return fault;
 }

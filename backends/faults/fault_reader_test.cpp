@@ -60,12 +60,13 @@ TEST(FaultReader, TheOrderIsKept) {
 
 TEST(FaultReader, NamesThatThePlatformDoesNotHaveAreRefused) {
   EXPECT_EQ(read(R"([{"operation":"CaptureStream.start","object":"back","action":"fail"}])"),
-            R"([0].object: "back" is not an object of CaptureStream.start; known are "wide", "tele".)");
+            R"([0].object: "back" is not an object of CaptureStream.start; expected one of "wide", "tele".)");
   EXPECT_EQ(read(R"([{"operation":"HidDevice.open","object":"far","action":"fail"}])"),
-            R"([0].object: "far" is not an object of HidDevice.open; known are "near".)");
-  EXPECT_EQ(read(R"([{"operation":"CaptureDevice.setValue","property":"Power","action":"fail"}])"),
-            R"([0].property: "Power" is not a property of CaptureDevice.setValue; known are "MultiCamConfiguration", )"
-            R"("MulticamSessionStatus".)");
+            R"([0].object: "far" is not an object of HidDevice.open; expected one of "near".)");
+  EXPECT_EQ(
+      read(R"([{"operation":"CaptureDevice.setValue","property":"Power","action":"fail"}])"),
+      R"([0].property: "Power" is not a property of CaptureDevice.setValue; expected one of "MultiCamConfiguration", )"
+      R"("MulticamSessionStatus".)");
 }
 
 TEST(FaultReader, AListThatIsNotThereTakesAnyName) {
@@ -83,15 +84,14 @@ TEST(FaultReader, AListThatIsNotThereTakesAnyName) {
   EXPECT_EQ(read(R"([{"operation":"HidDevice.setFeatureReportWithID","property":"0xc","action":"fail"}])", targets),
             R"([0].property: "0xc" is not a feature report's ID; write it with two digits, like "0x0A".)");
   EXPECT_EQ(read(R"([{"operation":"CaptureStream.start","object":"far","action":"fail"}])", targets),
-            R"([0].object: "far" is not an object of CaptureStream.start; known are "wide", "tele".)");
+            R"([0].object: "far" is not an object of CaptureStream.start; expected one of "wide", "tele".)");
 }
 
 TEST(FaultReader, APlatformWithoutObjectsOfAKindTakesNoObject) {
   FaultTargets targets = smallTargets();
   targets.groups.clear();
   EXPECT_EQ(read(R"([{"operation":"SynchronizedStreamsGroup.streams","object":"back","action":"fail"}])", targets),
-            "[0].object: SynchronizedStreamsGroup.streams is not called on a camera, a group or a HID device; leave it "
-            "out.");
+            "[0].object: SynchronizedStreamsGroup.streams has no object; remove this key.");
 }
 
 }  // namespace

@@ -29,7 +29,7 @@ std::string suggestion(std::string_view name, std::span<const std::string_view> 
   }
   std::string known;
   for (const std::string_view candidate : names) known += (known.empty() ? "" : ", ") + inQuotes(candidate);
-  return "; known are " + known + ".";
+  return "; expected one of " + known + ".";
 }
 
 void JsonCursor::fail(const std::string& sentence) const { fail(sentence, path_); }
@@ -53,7 +53,7 @@ const Json& JsonCursor::object() const {
 void JsonCursor::allowKeys(std::initializer_list<std::string_view> keys) const {
   for (const auto& [key, value] : object().items()) {
     if (std::ranges::find(keys, key) != keys.end()) continue;
-    fail("there is no key " + inQuotes(key) + suggestion(key, keys), jsonPath(path_, key));
+    fail("unknown key " + inQuotes(key) + suggestion(key, keys), jsonPath(path_, key));
   }
 }
 
@@ -89,7 +89,7 @@ bool JsonCursor::boolean() const {
 }
 
 std::string JsonCursor::text() const {
-  if (!value_->is_string() || value_->get_ref<const std::string&>().empty()) failType("a string that is not empty");
+  if (!value_->is_string() || value_->get_ref<const std::string&>().empty()) failType("a non-empty string");
   return value_->get<std::string>();
 }
 

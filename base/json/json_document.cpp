@@ -125,7 +125,7 @@ class Tracker {
     Container& object = open_.back();
     object.key.clear();
     if (!object.keys.insert(key).second) {
-      throw InputError(place() + "the key " + Json(key).dump() + " stands twice; leave one of the two.");
+      throw InputError(place() + "the key " + Json(key).dump() + " is duplicated; remove one.");
     }
     object.key = key;
   }
@@ -144,16 +144,16 @@ std::string complaintOf(const Json::parse_error& error) {
 
 Json parsed(std::string_view text, const std::string& name) {
   if (const std::optional<std::size_t> invalid = findInvalidUtf8(text)) {
-    throw InputError(name + ":" + lineAt(text, *invalid) + ": this is not UTF-8; save the file in that encoding.");
+    throw InputError(name + ":" + lineAt(text, *invalid) + ": the file is not valid UTF-8.");
   }
   Tracker tracker(name);
   try {
     return tracker.parse(text, [] {});
   } catch (const Json::parse_error& error) {
     const std::size_t offset = error.byte == 0 ? 0 : error.byte - 1;
-    throw InputError(name + ":" + lineAt(text, offset) + ": this is not JSON: " + complaintOf(error) + ".");
+    throw InputError(name + ":" + lineAt(text, offset) + ": not valid JSON: " + complaintOf(error) + ".");
   } catch (const Json::out_of_range&) {
-    throw InputError(tracker.place() + "the number is too large; a double must hold it.");
+    throw InputError(tracker.place() + "the number is too large for a double.");
   }
 }
 
@@ -161,7 +161,7 @@ std::string textOf(const std::filesystem::path& file) {
   const std::string name = file.string();
   std::error_code failure;
   const std::filesystem::file_status status = std::filesystem::status(file, failure);
-  if (status.type() == std::filesystem::file_type::not_found) throw InputError(name + ": there is no such file.");
+  if (status.type() == std::filesystem::file_type::not_found) throw InputError(name + ": the file does not exist.");
   if (std::filesystem::is_directory(status)) throw InputError(name + ": this is a directory, not a file.");
   std::ifstream stream(file, std::ios::binary);
   if (!stream) throw InputError(name + ": the file cannot be opened; check its permissions.");

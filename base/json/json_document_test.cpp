@@ -59,24 +59,24 @@ std::string problemOf(const std::string& text) {
 }
 
 TEST(JsonDocument, TellsTheLineOfWhatIsWrong) {
-  EXPECT_EQ(problemOf("{\n\"a\": 1,\n\"a\": 2}"), "a.json:3: the key \"a\" stands twice; leave one of the two.");
+  EXPECT_EQ(problemOf("{\n\"a\": 1,\n\"a\": 2}"), "a.json:3: the key \"a\" is duplicated; remove one.");
   EXPECT_EQ(problemOf("{\"b\": [\n{\"a\": 1,\n\"a\": 2}]}"),
-            "a.json:3: b[0]: the key \"a\" stands twice; leave one of the two.");
-  EXPECT_EQ(problemOf("{\n\"a\": 1e999}"), "a.json:2: a: the number is too large; a double must hold it.");
+            "a.json:3: b[0]: the key \"a\" is duplicated; remove one.");
+  EXPECT_EQ(problemOf("{\n\"a\": 1e999}"), "a.json:2: a: the number is too large for a double.");
   EXPECT_EQ(problemOf("\n" + std::string(40, '[')), "a.json:2: the document is nested more than 32 deep.");
-  EXPECT_THAT(problemOf("{\n\n\"a\" 1}"), testing::StartsWith("a.json:3: this is not JSON: "));
-  EXPECT_EQ(problemOf("\n\xff"), "a.json:2: this is not UTF-8; save the file in that encoding.");
+  EXPECT_THAT(problemOf("{\n\n\"a\" 1}"), testing::StartsWith("a.json:3: not valid JSON: "));
+  EXPECT_EQ(problemOf("\n\xff"), "a.json:2: the file is not valid UTF-8.");
 }
 
 TEST(JsonDocument, SaysWhyAFileCannotBeRead) {
   const auto problemWith = [](const char* file) {
     return problemOfCall([file] { static_cast<void>(JsonDocument::read(file)); });
   };
-  EXPECT_THAT(problemWith("/dev/null"), testing::StartsWith("/dev/null:1: this is not JSON: "));
+  EXPECT_THAT(problemWith("/dev/null"), testing::StartsWith("/dev/null:1: not valid JSON: "));
   EXPECT_EQ(problemWith("/proc/self/mem"), "/proc/self/mem: the file cannot be read.");
   EXPECT_EQ(problemWith("/dev/zero"), "/dev/zero: the file is larger than 16 MiB.");
   EXPECT_EQ(problemWith("/proc"), "/proc: this is a directory, not a file.");
-  EXPECT_EQ(problemWith("/proc/nothing"), "/proc/nothing: there is no such file.");
+  EXPECT_EQ(problemWith("/proc/nothing"), "/proc/nothing: the file does not exist.");
 }
 
 TEST(JsonDocument, NamesTheLineWhereThePlaceIsInTheText) {

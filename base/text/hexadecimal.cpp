@@ -11,7 +11,7 @@ constexpr std::string_view kUppercaseDigits = "0123456789ABCDEF";
 
 unsigned numberOfDigit(char digit) {
   const std::size_t number = kLowercaseDigits.find(digit);
-  if (number == std::string_view::npos) throw InputError("a hexadecimal digit is wrong");
+  if (number == std::string_view::npos) throw InputError("invalid hexadecimal digit");
   return static_cast<unsigned>(number);
 }
 
@@ -32,7 +32,7 @@ std::string hexadecimal(std::span<const std::uint8_t> bytes) {
 }
 
 std::string parseHexadecimal(std::string_view text) {
-  if (text.size() % 2 != 0) throw InputError("hexadecimal digits are not in pairs");
+  if (text.size() % 2 != 0) throw InputError("odd number of hexadecimal digits");
   std::string bytes;
   bytes.reserve(text.size() / 2);
   for (std::size_t i = 0; i < text.size(); i += 2) {

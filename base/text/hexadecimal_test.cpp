@@ -26,9 +26,9 @@ TEST(ParseHexadecimal, RefusesEverythingElse) {
   const struct {
     const char* text;
     const char* problem;
-  } kRows[] = {{"0", "hexadecimal digits are not in pairs"}, {"abc", "hexadecimal digits are not in pairs"},
-               {"0G", "a hexadecimal digit is wrong"},       {"g0", "a hexadecimal digit is wrong"},
-               {"A0", "a hexadecimal digit is wrong"},       {" 0", "a hexadecimal digit is wrong"}};
+  } kRows[] = {{"0", "odd number of hexadecimal digits"}, {"abc", "odd number of hexadecimal digits"},
+               {"0G", "invalid hexadecimal digit"},       {"g0", "invalid hexadecimal digit"},
+               {"A0", "invalid hexadecimal digit"},       {" 0", "invalid hexadecimal digit"}};
   for (const auto& row : kRows) {
     EXPECT_THAT([&] { static_cast<void>(parseHexadecimal(row.text)); }, testing::ThrowsMessage<InputError>(row.problem))
         << row.text;

@@ -107,8 +107,8 @@ class RefusalTest(CommandLineTest):
             return '{"schema": 1, "diagnostics": {' + text + "}}"
 
         rows = {
-            "missing": (None, ": there is no such file."),
-            "malformed": ("{", ":1: this is not JSON: "),
+            "missing": (None, ": the file does not exist."),
+            "malformed": ("{", ":1: not valid JSON: "),
             "schema": ('{"schema": 9, "diagnostics": {}}', 'schema: must be 1, not 9.'),
             "diagnostic": (entry('"Fake.Oen": {}'), "'Fake.Oen', which matches no diagnostic; did you mean 'Fake.One'?"),
             "parameter": (entry('"Fake.*": {"experiment": {"duratoin": 1}}'), "did you mean 'duration'?"),

@@ -32,9 +32,9 @@ void readExperimentRun(const JsonCursor& cursor, ExpectedOutcome& outcome) {
   }
   if (const auto images = cursor.find("images")) outcome.images = images->integer(0, kMaxImages);
   if (outcome.verdict == "fail") {
-    cursor.fail("nobody judges an experiment that is run alone: it passes or ends in an error.");
+    cursor.fail("an experiment that runs on its own is not judged; it can only pass or end in an error.");
   }
-  if (outcome.images && outcome.verdict != "pass") cursor.fail("only the verdict \"pass\" has images.");
+  if (outcome.images && outcome.verdict != "pass") cursor.fail("only the verdict \"pass\" can have images.");
 }
 
 ExpectedOutcome readOutcome(const std::string& name, const JsonCursor& cursor) {
@@ -45,18 +45,18 @@ ExpectedOutcome readOutcome(const std::string& name, const JsonCursor& cursor) {
   outcome.verdict = cursor.at("verdict").oneOf(kVerdicts, "a verdict");
   outcome.error = readExpectedError(cursor, "error");
   outcome.underlying = readExpectedError(cursor, "underlying");
-  if (outcome.error && outcome.verdict != "error") cursor.fail("only the verdict \"error\" has an error.");
-  if (outcome.underlying && !outcome.error) cursor.fail("an underlying error needs an error above it.");
+  if (outcome.error && outcome.verdict != "error") cursor.fail("only the verdict \"error\" can have an error.");
+  if (outcome.underlying && !outcome.error) cursor.fail("an underlying error requires an \"error\".");
   if (const auto results = cursor.find("failedResults")) {
-    if (outcome.verdict != "fail") results->fail("only the verdict \"fail\" has failed results.");
+    if (outcome.verdict != "fail") results->fail("only the verdict \"fail\" can have failed results.");
     for (const JsonCursor& result : results->elements()) outcome.failedResults.push_back(result.text());
   }
   if (cursor.find("experiment")) {
     readExperimentRun(cursor, outcome);
     return outcome;
   }
-  if (cursor.find("parameters")) cursor.fail("only a run of an experiment has parameters; name the \"experiment\".");
-  if (cursor.find("images")) cursor.fail("only a run of an experiment has images; name the \"experiment\".");
+  if (cursor.find("parameters")) cursor.fail("only the run of an experiment can have parameters; add \"experiment\".");
+  if (cursor.find("images")) cursor.fail("only the run of an experiment can have images; add \"experiment\".");
   return outcome;
 }
 

@@ -53,19 +53,19 @@ TEST(ParseProfile, RefusesWhatIsNotExactlyOfTheForm) {
     const char* problem;
   };
   const Row rows[] = {
-      {"an empty file", "", "1: this is not JSON: "},
-      {"no JSON", "duration = 3", "1: this is not JSON: "},
-      {"JSON with something behind", withDiagnostics("{}") + "x", "1: this is not JSON: "},
+      {"an empty file", "", "1: not valid JSON: "},
+      {"no JSON", "duration = 3", "1: not valid JSON: "},
+      {"JSON with something behind", withDiagnostics("{}") + "x", "1: not valid JSON: "},
       {"no object", "[]", "1: the document: must be an object, not an array."},
       {"no schema", R"({"diagnostics": {}})", "1: the document: the key \"schema\" is missing."},
       {"another schema", "{\"diagnostics\": {},\n\"schema\": 2}", "2: schema: must be 1, not 2."},
       {"no diagnostics", R"({"schema": 1})", "1: the document: the key \"diagnostics\" is missing."},
       {"diagnostics that are no object", withDiagnostics("3"), "1: diagnostics: must be an object, not 3."},
       {"an unknown key", R"({"schema": 1, "diagnostic": {}})",
-       "1: the document: there is no key \"diagnostic\"; did you mean \"diagnostics\"?"},
+       "1: the document: unknown key \"diagnostic\"; did you mean \"diagnostics\"?"},
       {"an entry that is no object", withDiagnostics(R"({"A": 3})"), "1: diagnostics.A: must be an object, not 3."},
       {"an unknown half", withDiagnostics(R"({"A": {"experimant": {}}})"),
-       "1: diagnostics.A: there is no key \"experimant\"; did you mean \"experiment\"?"},
+       "1: diagnostics.A: unknown key \"experimant\"; did you mean \"experiment\"?"},
       {"a half that is no object", withDiagnostics(R"({"A": {"analysis": []}})"),
        "1: diagnostics.A.analysis: must be an object, not an array."},
       {"a value that is text", withDiagnostics(R"({"A": {"experiment": {"x": "3"}}})"),
@@ -75,9 +75,9 @@ TEST(ParseProfile, RefusesWhatIsNotExactlyOfTheForm) {
       {"a value that is null", withDiagnostics(R"({"A": {"analysis": {"x": null}}})"),
        "1: diagnostics.A.analysis.x: must be a number, not null."},
       {"a number beyond all numbers", withDiagnostics(R"({"A": {"experiment": {"x": 1e999}}})"),
-       "1: diagnostics.A.experiment.x: the number is too large; a double must hold it."},
+       "1: diagnostics.A.experiment.x: the number is too large for a double."},
       {"a parameter twice", withDiagnostics(R"({"A": {"experiment": {"x": 1, "x": 2}}})"),
-       "1: diagnostics.A.experiment: the key \"x\" stands twice; leave one of the two."},
+       "1: diagnostics.A.experiment: the key \"x\" is duplicated; remove one."},
       {"experiments that are no object", R"({"schema": 1, "diagnostics": {}, "experiments": 3})",
        "1: experiments: must be an object, not 3."},
       {"an experiment that is no object", R"({"schema": 1, "diagnostics": {}, "experiments": {"E": 3}})",
@@ -85,7 +85,7 @@ TEST(ParseProfile, RefusesWhatIsNotExactlyOfTheForm) {
       {"an experiment's value that is text", R"({"schema": 1, "diagnostics": {}, "experiments": {"E": {"x": "3"}}})",
        "1: experiments.E.x: must be a number, not \"3\"."},
       {"an entry twice", withDiagnostics(R"({"A": {}, "A": {}})"),
-       "1: diagnostics: the key \"A\" stands twice; leave one of the two."},
+       "1: diagnostics: the key \"A\" is duplicated; remove one."},
   };
   for (const Row& row : rows) {
     EXPECT_THAT(refusalOf(row.text), testing::StartsWith(std::string("some.json:") + row.problem)) << row.name;
@@ -135,7 +135,7 @@ TEST(ReadProfile, RefusesWhatIsNotAFileOfAProfilesSize) {
     }
     return std::string("accepted");
   };
-  EXPECT_EQ(problemOf("/nowhere/p.json"), "/nowhere/p.json: there is no such file.");
+  EXPECT_EQ(problemOf("/nowhere/p.json"), "/nowhere/p.json: the file does not exist.");
   EXPECT_EQ(problemOf("/"), "/: this is a directory, not a file.");
   EXPECT_EQ(problemOf("/dev/zero"), "/dev/zero: the file is larger than 16 MiB.");
 }

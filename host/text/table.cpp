@@ -28,7 +28,7 @@ void appendEscaped(std::string& shown, std::string_view bytes) {
   for (; !bytes.empty(); bytes.remove_prefix(1)) shown += "\\x" + hexadecimal(bytes.substr(0, 1));
 }
 
-// With what steers a terminal, and what is no text at all, shown as \xNN; but for the characters of `allowed`.
+// Escapes control characters and invalid UTF-8 as \xNN, except the characters in `allowed`.
 std::string shownText(std::string_view text, std::string_view allowed) {
   std::string shown;
   shown.reserve(text.size());

@@ -27,7 +27,7 @@ constexpr std::size_t kMaxCardLength = 31;
 constexpr std::size_t kMaxBusInfoLength = 31;
 constexpr std::uint64_t kLastMetadataByte = 16777215;  // of a buffer
 
-// A key that means nothing, but must be a text where it is there.
+// An optional comment key. If present, it must be a string.
 void checkRemark(const JsonCursor& cursor, std::string_view key) {
   if (const auto remark = cursor.find(key)) static_cast<void>(remark->text());
 }
@@ -36,15 +36,15 @@ void checkRemark(const JsonCursor& cursor, std::string_view key) {
 std::vector<std::pair<std::string, JsonCursor>> namedEntries(const JsonCursor& cursor) {
   std::vector<std::pair<std::string, JsonCursor>> entries = cursor.entries();
   for (const auto& [name, ignored] : entries) {
-    if (name.empty()) cursor.fail("an entry has no name; give it one.");
+    if (name.empty()) cursor.fail("an entry has an empty name.");
   }
   return entries;
 }
 
 std::string readControlName(const std::string& name, const JsonCursor& cursor) {
   if (name.size() <= kMaxControlNameLength) return name;
-  cursor.fail(inQuotes(name) + " is no control's name, which has at most " + std::to_string(kMaxControlNameLength) +
-              " characters.");
+  cursor.fail(inQuotes(name) + " is not a valid control name; names have at most " +
+              std::to_string(kMaxControlNameLength) + " characters.");
 }
 
 std::optional<std::string> findDeviceText(const JsonCursor& cursor, std::string_view key, std::size_t longest) {
@@ -52,8 +52,8 @@ std::optional<std::string> findDeviceText(const JsonCursor& cursor, std::string_
   if (!found) return std::nullopt;
   std::string text = found->text();
   if (text.size() > longest) {
-    found->fail("no driver tells more than " + std::to_string(longest) + " characters here, and this has " +
-                std::to_string(text.size()) + "; quazor phone probe shows what it tells.");
+    found->fail("a driver reports at most " + std::to_string(longest) + " characters here, and this has " +
+                std::to_string(text.size()) + "; 'quazor phone probe' shows the reported text.");
   }
   return text;
 }
@@ -69,7 +69,7 @@ VideoNodeMatch readMatch(const JsonCursor& cursor) {
                        findDeviceText(cursor, "card", kMaxCardLength),
                        findDeviceText(cursor, "busInfo", kMaxBusInfoLength)};
   if (!match.driver && !match.card && !match.busInfo) {
-    cursor.fail("give at least one of \"driver\", \"card\" and \"busInfo\"; quazor phone probe shows them.");
+    cursor.fail("give at least one of \"driver\", \"card\" and \"busInfo\"; 'quazor phone probe' shows them.");
   }
   return match;
 }
@@ -110,11 +110,11 @@ MetadataBinding readMetadata(const JsonCursor& cursor) {
   }
   if (const auto node = cursor.find("node")) metadata.node = readMatch(*node);
   if (const auto fields = cursor.find("fields")) {
-    if (!metadata.node) fields->fail("there is no metadata node to read them from; say by \"node\" which one it is.");
+    if (!metadata.node) fields->fail("\"fields\" requires a metadata \"node\".");
     for (const auto& [key, value] : namedEntries(*fields)) metadata.fields.push_back(readField(key, value));
   }
   if (metadata.node && metadata.fields.empty()) {
-    cursor.at("node").fail("nothing is read from the metadata node; say by \"fields\" what is, or leave it out.");
+    cursor.at("node").fail("a metadata \"node\" requires \"fields\"; add them or remove the node.");
   }
   if (const auto controls = cursor.find("controls")) {
     for (const auto& [key, value] : namedEntries(*controls)) {
@@ -129,10 +129,10 @@ ProjectorBinding readProjector(const JsonCursor& cursor) {
   ProjectorBinding projector;
   if (const auto on = cursor.find("on")) projector.on = readSettings(*on);
   projector.off = readSettings(cursor.at("off"));
-  if (projector.off.empty()) cursor.at("off").fail("name the controls that put the light out.");
+  if (projector.off.empty()) cursor.at("off").fail("name the controls that switch the projector off.");
   for (const ControlSetting& setting : projector.on) {
     if (std::ranges::find(projector.off, setting.control, &ControlSetting::control) != projector.off.end()) continue;
-    cursor.at("on").at(setting.control).fail("\"off\" must set this control too, so that the light goes out again.");
+    cursor.at("on").at(setting.control).fail("\"off\" must also set this control, to switch the projector off again.");
   }
   projector.modeControl = findControl(cursor, "modeControl");
   projector.patternControl = findControl(cursor, "patternControl");
@@ -147,7 +147,7 @@ ErrorCounterBinding readErrorCounter(const std::string& name, const JsonCursor& 
   counter.control = findControl(cursor, "control");
   if (const auto file = cursor.find("file")) counter.file = readPathText(*file);
   if (counter.file.has_value() == counter.control.has_value()) {
-    cursor.fail("give either \"file\" or \"control\": where the count is read.");
+    cursor.fail("give either \"file\" or \"control\" as the source of the count.");
   }
   return counter;
 }
@@ -186,7 +186,7 @@ std::vector<CameraBinding> readCameras(const JsonCursor& cursor) {
     const auto isSame = [&camera](const CameraBinding& other) { return other.node == camera.node; };
     if (const auto same = std::ranges::find_if(cameras, isSame); same != cameras.end()) {
       value.at("node").fail("this is the node of " + inQuotes(same->port) +
-                            "; every camera needs one of its own, told apart by its busInfo, for example.");
+                            "; every camera needs its own node. Distinguish them, for example by busInfo.");
     }
     cameras.push_back(std::move(camera));
   }
@@ -203,7 +203,8 @@ GroupBinding readGroup(const std::string& name, const JsonCursor& cursor, const 
   group.name = name;
   for (const JsonCursor& element : cursor.at("cameras").elements()) {
     const std::string port = element.oneOf(ports, "a camera of this binding");
-    if (std::ranges::find(group.ports, port) != group.ports.end()) element.fail("the camera stands twice; leave one.");
+    if (std::ranges::find(group.ports, port) != group.ports.end())
+      element.fail("the camera is listed twice; remove one.");
     group.ports.push_back(port);
   }
   if (group.ports.empty()) cursor.at("cameras").fail("a group needs at least one camera.");
@@ -241,7 +242,7 @@ Binding bindingOf(const JsonCursor& document) {
     const JsonCursor connector = display->at("connector");
     binding.display = DisplayBinding{connector.text()};
     if (binding.display->connector.find('/') != std::string::npos || binding.display->connector.starts_with("card")) {
-      connector.fail("must be the connector's name without that of its card, as \"HDMI-A-1\".");
+      connector.fail("must be the name of the connector without its card, such as \"HDMI-A-1\".");
     }
   }
   if (const auto faults = document.find("faults")) binding.faults = readFaults(*faults, targetsOf(binding));

@@ -38,16 +38,16 @@ NamePattern patternIn(const JsonCursor& cursor) {
   }
 }
 
-// A folder's name with nothing in it but * that stands for anything.
+// A folder name in which only * is a wildcard.
 std::string readEventPattern(const JsonCursor& cursor, bool* isLiteral) {
   std::string text = cursor.text();
   if (text == "." || text == ".." || text.find_first_of(std::string_view("/\0", 2)) != std::string::npos) {
-    cursor.fail("must be the name of a folder of tracefs's events, not a path.");
+    cursor.fail("must be the name of a folder in the events of tracefs, not a path.");
   }
   const NamePattern pattern = patternIn(cursor);
   *isLiteral = pattern.isLiteral();
   for (const Part& part : kParts) {
-    if (pattern.hasPlaceholder(part.key)) cursor.fail("only * stands for any text here, not a placeholder.");
+    if (pattern.hasPlaceholder(part.key)) cursor.fail("only * is allowed here, not a placeholder.");
   }
   return text;
 }
@@ -62,8 +62,7 @@ std::optional<std::string> findPart(const JsonCursor& cursor, std::string_view k
   std::optional<std::string> text = findText(cursor, key);
   for (const Part& part : kParts) {
     if (!text || text->find(part.placeholder) == std::string::npos) continue;
-    cursor.at(key).fail("a placeholder stands for something in the path only; give the " + std::string(key) +
-                        " as it is.");
+    cursor.at(key).fail("placeholders are allowed only in the path; give the " + std::string(key) + " as it is.");
   }
   return text;
 }
@@ -78,26 +77,26 @@ CounterFilesBinding readCounterFiles(const JsonCursor& cursor) {
   files.key = findText(cursor, "key");
   const bool keyIsName = files.key == kNameAsKey;
   if (files.key && !keyIsName && files.key->find_first_of(" \t\n{}") != std::string::npos) {
-    cursor.at("key").fail("must be one key of the file's lines, or \"{name}\" for a channel of each.");
+    cursor.at("key").fail("must be a key in the file, or \"{name}\" for one channel per key.");
   }
   for (const Part& part : kParts) {
     const bool inPath = path.hasPlaceholder(part.key);
     const bool inKey = keyIsName && part.key == "name";
     const std::string placeholder = inQuotes(part.placeholder);
     files.*(part.text) = findPart(cursor, part.key);
-    if (inPath && inKey) cursor.at("key").fail("\"{name}\" stands in the path already; leave one.");
+    if (inPath && inKey) cursor.at("key").fail("the path already contains \"{name}\"; remove one.");
     if ((inPath || inKey) && files.*(part.text)) {
-      cursor.at(part.key).fail("the placeholder " + placeholder + " says it already; leave one of the two.");
+      cursor.at(part.key).fail("the placeholder " + placeholder + " already gives it; remove one of them.");
     }
     if (!inPath && !inKey && !(files.*(part.text))) {
-      cursor.fail("nothing says the channels' " + std::string(part.key) + "; give \"" + std::string(part.key) +
-                  "\", or " + placeholder + " in the path.");
+      cursor.fail("the channels have no " + std::string(part.key) + "; give \"" + std::string(part.key) + "\", or " +
+                  placeholder + " in the path.");
     }
   }
   const std::string_view key = files.key && !keyIsName ? std::string_view(*files.key) : std::string_view();
   const std::string_view gauge = gaugeReason(files.path, key);
   if (path.isLiteral() && !keyIsName && !gauge.empty()) {
-    pathCursor.fail("this number is no counter: " + std::string(gauge) + ", so it goes down too.");
+    pathCursor.fail("this number is not a counter: " + std::string(gauge) + ", so it can decrease.");
   }
   return files;
 }
@@ -114,7 +113,7 @@ TracepointBinding readTracepoints(const JsonCursor& cursor) {
   tracepoints.subgroup = findText(cursor, "subgroup");
   tracepoints.name = findText(cursor, "name");
   if (tracepoints.name && !(oneSystem && oneEvent)) {
-    cursor.at("name").fail("several events would have this one name; leave it out, and each has its own.");
+    cursor.at("name").fail("several events would have the same name; remove it to use the name of each event.");
   }
   return tracepoints;
 }
@@ -130,7 +129,7 @@ std::vector<Entry> readAll(const JsonCursor& cursor, Entry (*read)(const JsonCur
     Entry entry = read(element);
     const auto isSame = [&entry](const Entry& other) { return allOf(other) == allOf(entry); };
     if (const auto same = std::ranges::find_if(entries, isSame); same != entries.end()) {
-      element.fail("this is the same as entry " + std::to_string(same - entries.begin()) + " of the list; leave one.");
+      element.fail("this is the same as entry " + std::to_string(same - entries.begin()) + " of the list; remove one.");
     }
     entries.push_back(std::move(entry));
   }
@@ -147,16 +146,16 @@ std::vector<TracepointBinding> readAllTracepoints(const JsonCursor& cursor) { re
 
 std::string readPathText(const JsonCursor& cursor) {
   std::string path = cursor.text();
-  if (!path.starts_with('/')) cursor.fail("must be an absolute path, as \"/sys/...\".");
+  if (!path.starts_with('/')) cursor.fail("must be an absolute path, such as \"/sys/...\".");
   if (path.size() > kMaxPathLength) {
-    cursor.fail("is longer than a path can be, which is " + std::to_string(kMaxPathLength) + " bytes.");
+    cursor.fail("is longer than the maximum length of a path, " + std::to_string(kMaxPathLength) + " bytes.");
   }
-  if (path.find('\0') != std::string::npos) cursor.fail("no path can hold the character \\u0000.");
+  if (path.find('\0') != std::string::npos) cursor.fail("a path cannot contain the character \\u0000.");
   for (std::size_t begin = 1; begin <= path.size();) {
     const std::size_t end = std::min(path.find('/', begin), path.size());
     const std::string component = path.substr(begin, end - begin);
     if (component.empty() || component == "." || component == "..") {
-      cursor.fail("must be a path without \"//\", \".\", \"..\" and a \"/\" at its end.");
+      cursor.fail("must be a path without \"//\", \".\", \"..\" or a trailing \"/\".");
     }
     begin = end + 1;
   }

@@ -8,10 +8,10 @@
 namespace quazor {
 namespace {
 
-constexpr std::string_view kStock = "it tells how much there is now";
+constexpr std::string_view kStock = "it is a current amount";
 constexpr std::string_view kReading = "it is a reading of a sensor";
 constexpr std::string_view kSetting = "it is a setting";
-constexpr std::string_view kState = "it tells how something is now";
+constexpr std::string_view kState = "it is a current state";
 
 struct Rule {
   std::string_view file;

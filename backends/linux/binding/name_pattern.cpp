@@ -38,19 +38,19 @@ NamePattern NamePattern::parse(std::string_view text) {
     std::string placeholder;
     if (character != '*') {
       const std::size_t end = character == '{' ? text.find('}', at) : std::string_view::npos;
-      if (end == std::string_view::npos) throw InputError("holds a brace without its other one.");
+      if (end == std::string_view::npos) throw InputError("contains an unmatched brace.");
       placeholder = text.substr(at + 1, end - at - 1);
       length = placeholder.size() + 2;
       if (placeholderNamed(placeholder) == nullptr) {
-        throw InputError("holds the unknown placeholder \"{" + placeholder +
-                         "}\"; known are \"{group}\", \"{subgroup}\" and \"{name}\".");
+        throw InputError("contains the unknown placeholder \"{" + placeholder +
+                         "}\"; expected one of \"{group}\", \"{subgroup}\" and \"{name}\".");
       }
       if (pattern.hasPlaceholder(placeholder)) {
-        throw InputError("holds the placeholder \"{" + placeholder + "}\" twice; leave one.");
+        throw InputError("contains the placeholder \"{" + placeholder + "}\" twice; remove one.");
       }
     }
     if (!pattern.wildcards_.empty() && literal.empty()) {
-      throw InputError("has nothing between two parts that stand for any text; where one ends cannot be known.");
+      throw InputError("needs text between two placeholders or *, so that they can be told apart.");
     }
     pattern.wildcards_.push_back({std::move(placeholder), {}});
     at += length;

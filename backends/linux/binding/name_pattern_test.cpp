@@ -77,12 +77,12 @@ TEST(NamePattern, RefusesWhatIsNone) {
     const char* pattern;
     const char* problem;
   } kRows[] = {
-      {"{", "holds a brace without its other one."},
-      {"a{b", "holds a brace without its other one."},
-      {"a}b", "holds a brace without its other one."},
-      {"**", "has nothing between two parts that stand for any text; where one ends cannot be known."},
-      {"{}", "holds the unknown placeholder \"{}\"; known are \"{group}\", \"{subgroup}\" and \"{name}\"."},
-      {"{name}-{name}", "holds the placeholder \"{name}\" twice; leave one."},
+      {"{", "contains an unmatched brace."},
+      {"a{b", "contains an unmatched brace."},
+      {"a}b", "contains an unmatched brace."},
+      {"**", "needs text between two placeholders or *, so that they can be told apart."},
+      {"{}", "contains the unknown placeholder \"{}\"; expected one of \"{group}\", \"{subgroup}\" and \"{name}\"."},
+      {"{name}-{name}", "contains the placeholder \"{name}\" twice; remove one."},
   };
   for (const auto& row : kRows) {
     EXPECT_THAT([&] { static_cast<void>(NamePattern::parse(row.pattern)); },

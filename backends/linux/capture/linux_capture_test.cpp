@@ -49,7 +49,7 @@ TEST(LinuxCaptureTest, ACameraThatAnotherProcessUsesIsRefused) {
   Fake fake;
   const int other = fake.kernel->open(fake.nodes[0]);
   ASSERT_EQ(fake.kernel->lock(other), 0);
-  EXPECT_EQ(fake.take(0), "8 " + fake.nodes[0] + " is in use by another process of this kind.");
+  EXPECT_EQ(fake.take(0), "8 " + fake.nodes[0] + " is in use by another quazor process.");
   fake.kernel->close(other);
   EXPECT_EQ(fake.take(0), "done");
 }

@@ -60,10 +60,10 @@ TEST(LinuxStreamTest, AFormatThatIsNotThereOrHasAnotherSizeIsRefused) {
   binding.cameras[1].width = 800;
   Fake fake(binding);
   ASSERT_EQ(fake.take(CaptureStreams{fake.streams[0], fake.streams[1]}), "done");
-  EXPECT_EQ(fake.set(fake.wide(), capture_key::FormatIndex, 2), "5 " + fake.nodes[0] + " has no format of index 2.");
+  EXPECT_EQ(fake.set(fake.wide(), capture_key::FormatIndex, 2), "5 " + fake.nodes[0] + " has no format with index 2.");
   EXPECT_EQ(
       fake.set(fake.stream(1), capture_key::FormatIndex, 1),
-      "5 " + fake.nodes[1] + ": format 1 (GREY) of 800 x 360 is not to be had; the driver offers GREY of 640 x 360.");
+      "5 " + fake.nodes[1] + ": format 1 (GREY) of 800 x 360 is not available; the driver offers GREY of 640 x 360.");
 }
 
 TEST(LinuxStreamTest, ARateThatTheDriverSilentlyChangesIsRefusedWithTheDriversOwn) {

@@ -87,12 +87,12 @@ class Probe {
       }
       tellReports("input", node.descriptor.inputReports);
       tellReports("feature", node.descriptor.featureReports);
-      if (!node.problem.empty()) tell("    does not fit: " + node.problem);
+      if (!node.problem.empty()) tell("    unsuitable: " + node.problem);
       if (node.noAccess.empty()) continue;
-      tell("    does not fit: " + node.noAccess);
-      tell("    docs/linux.md has a udev rule that gives it to a group.");
+      tell("    unsuitable: " + node.noAccess);
+      tell("    docs/linux.md has a udev rule that assigns it to a group.");
     }
-    if (!nodes.empty()) tell("  They need no binding: plug-ins look for them by usage page and usage.");
+    if (!nodes.empty()) tell("  They need no binding: plug-ins find them by usage page and usage.");
   }
 
   void tellReports(std::string_view kind, const std::map<std::uint8_t, std::uint32_t>& reports) {
@@ -131,7 +131,7 @@ class Probe {
     all.tracepoints = {{"*", "*", std::nullopt, std::nullopt, std::nullopt}};
     const std::vector<CounterChannel> channels = channelsOf(all, "tracepoints");
     if (channels.empty()) {
-      tell("    There are some where tracefs is mounted, at /sys/kernel/tracing, and may be looked at.");
+      tell("    They require tracefs to be mounted at /sys/kernel/tracing and readable.");
       return;
     }
     FileDescriptor counter;
@@ -139,7 +139,7 @@ class Probe {
     if (failure != 0) {
       DiagnosticErrorPtr error;
       failSystemCall(&error, "perf_event_open", channels.front().file, failure);
-      tell("    They may not be counted: " + error->localizedDescription());
+      tell("    This user may not count them: " + error->localizedDescription());
       tell("    The capability CAP_PERFMON, or a sysctl kernel.perf_event_paranoid of 0 or -1, allows it.");
       return;
     }

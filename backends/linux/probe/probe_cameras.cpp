@@ -46,7 +46,7 @@ std::string ratesText(const FrameSize& size) {
     if (!text.empty()) text += size.anyIntervalBetween ? " to " : ", ";
     text += rateText(interval);
   }
-  return text.empty() ? "rates that the driver does not tell" : text + " frames a second";
+  return text.empty() ? "rates that the driver does not report" : text + " frames a second";
 }
 
 std::string sizeText(const FrameSize& size) {
@@ -125,7 +125,7 @@ class CameraProbe {
       } else if (node.kind == VideoNodeKind::kMetadata) {
         tellMetadata(node);
       } else {
-        tell("    does not fit: it captures no video to buffers that a program maps, or in several planes");
+        tell("    unsuitable: it does not capture video to mapped buffers, or uses several planes");
       }
     }
     return std::move(cameras_);
@@ -135,9 +135,9 @@ class CameraProbe {
   void tell(std::string line) const { lines_->push_back(std::move(line)); }
 
   void tellProblem(const DiagnosticError& problem) const {
-    tell("    does not fit: " + problem.localizedDescription());
+    tell("    unsuitable: " + problem.localizedDescription());
     if (problem.code() == static_cast<std::int64_t>(LinuxErrorCode::kNoAccess)) {
-      tell("    Its group may use it, usually \"video\"; docs/linux.md has a udev rule that gives it to another.");
+      tell("    Its group, usually \"video\", may use it; docs/linux.md has a udev rule for another group.");
     }
   }
 
@@ -150,18 +150,18 @@ class CameraProbe {
     };
     const auto size = chosenSize(*details);
     if (!size) {
-      tell("    does not fit: its driver tells no format, or no size of the first one that a camera can have");
+      tell("    unsuitable: its driver reports no format, or no usable size for the first one");
     } else if (node.driver.empty() && node.card.empty() && node.busInfo.empty()) {
-      tell("    does not fit: its driver tells nothing of it by which a binding could name it");
+      tell("    unsuitable: its driver reports nothing that a binding could use to identify it");
     } else if (std::ranges::count_if(nodes_, isLikeIt) > 1) {
-      tell("    does not fit: another camera has the same driver, card and bus, so a binding cannot tell them apart");
+      tell("    unsuitable: another camera has the same driver, card and bus, so a binding cannot distinguish them");
     } else if (cameras_.size() == kPorts.size()) {
-      tell("    fits, but all ports are taken; put it in place of another one in the binding below");
+      tell("    suitable, but all ports are taken; use it instead of another camera in the binding below");
     } else {
       bind(node, *size);
     }
     if (size && std::ranges::none_of(details->formats.front().sizes, reachesUsualRate)) {
-      tell("    Its first format has no size at 30 frames a second, the rate of the diagnostics of cameras.");
+      tell("    Its first format has no size at 30 frames a second, the rate that the camera diagnostics use.");
     }
     tellFormats(details->formats, lines_);
     tellControls(details->controls, lines_);
@@ -169,7 +169,7 @@ class CameraProbe {
 
   void bind(const V4l2DeviceInfo& node, std::pair<std::uint32_t, std::uint32_t> size) {
     const std::string port(kPorts.at(cameras_.size()));
-    tell("    fits: " + port + " in the binding below; which one it really is, you must say");
+    tell("    suitable: " + port + " in the binding below; check which camera it really is");
     Json match = Json::object();
     if (!node.driver.empty()) match["driver"] = node.driver;
     if (!node.card.empty()) match["card"] = node.card;
@@ -183,9 +183,9 @@ class CameraProbe {
         continue;
       return tell("    metadata of " + camera.path.string() +
                   ", which is on the same bus; a binding's \"metadata\" "
-                  "may name it, with the fields of its buffers");
+                  "can use it, with the fields of its buffers");
     }
-    tell("    metadata of no camera that is on the same bus");
+    tell("    metadata, but no camera is on the same bus");
   }
 
   const std::shared_ptr<V4l2Api>& kernel_;

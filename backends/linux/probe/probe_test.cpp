@@ -73,7 +73,7 @@ TEST_F(ProbeTest, TellsOfAMachineWithNothing) {
                           "  /sys/fs/cgroup/{group}/{subgroup}/{name}/cpu.stat, key usage_usec: 0",
                           "  /sys/class/net/{subgroup}/statistics/{name}: 0",
                           "  /sys/bus/iio/devices/{subgroup}/in_{name}_raw: 0", "  /proc/vmstat, key {name}: 0",
-                          "  tracepoints: 0", HasSubstr("where tracefs is mounted")));
+                          "  tracepoints: 0", HasSubstr("require tracefs to be mounted")));
   EXPECT_EQ(binding_.title, "This machine");
   EXPECT_TRUE(binding_.cameras.empty() && binding_.groups.empty() && binding_.counterFiles.empty());
   EXPECT_FALSE(binding_.display);
@@ -82,8 +82,8 @@ TEST_F(ProbeTest, TellsOfAMachineWithNothing) {
 TEST_F(ProbeTest, BindsFiveCamerasToTheFivePorts) {
   for (int i = 0; i < 6; ++i) kernel_->add(i, fakeCamera("fake:" + std::to_string(i)));
   const std::vector<std::string> told = lines();
-  EXPECT_THAT(told, Contains("    fits: FrontFacingInfraredCamera in the binding below; which one it really is, you "
-                             "must say"));
+  EXPECT_THAT(
+      told, Contains("    suitable: FrontFacingInfraredCamera in the binding below; check which camera it really is"));
   EXPECT_THAT(told, Contains(HasSubstr("all ports are taken")));
   ASSERT_EQ(binding_.cameras.size(), 5U);
   EXPECT_EQ(binding_.cameras[0].port, "BackFacingCamera");
@@ -159,11 +159,11 @@ TEST_F(ProbeTest, TellsWhyACameraDoesNotFit) {
   busy.openProblem = EBUSY;
   kernel_->add(5, busy);
   const std::vector<std::string> told = lines();
-  EXPECT_THAT(told, Contains(HasSubstr("its driver tells no format")));
+  EXPECT_THAT(told, Contains(HasSubstr("its driver reports no format")));
   EXPECT_EQ(std::ranges::count_if(
                 told, [](const auto& line) { return line.find("another camera has the same driver") != line.npos; }),
             2);
-  EXPECT_THAT(told, Contains(HasSubstr("captures no video to buffers")));
+  EXPECT_THAT(told, Contains(HasSubstr("does not capture video to mapped buffers")));
   EXPECT_THAT(told, Contains(HasSubstr("DEV/video4 failed: Permission denied (EACCES)")));
   EXPECT_THAT(told, Contains(HasSubstr("(EBUSY)")));
   EXPECT_EQ(std::ranges::count_if(told, [](const auto& line) { return line.find("udev rule") != line.npos; }), 1);
@@ -179,8 +179,8 @@ TEST_F(ProbeTest, BindsNoCameraThatABindingCannotName) {
   absurd.formats = {{absurd.formats[0].code, "format", {{0, 0, {{1, 30}}}, {70000, 1, {{1, 30}}}}}};
   kernel_->add(1, absurd);
   const std::vector<std::string> told = lines();
-  EXPECT_THAT(told, Contains(HasSubstr("tells nothing of it by which a binding could name it")));
-  EXPECT_THAT(told, Contains(HasSubstr("no size of the first one that a camera can have")));
+  EXPECT_THAT(told, Contains(HasSubstr("reports nothing that a binding could use to identify it")));
+  EXPECT_THAT(told, Contains(HasSubstr("no usable size for the first one")));
   EXPECT_TRUE(binding_.cameras.empty());
 }
 
@@ -190,7 +190,7 @@ TEST_F(ProbeTest, TellsWhichCameraMetadataAreOf) {
   kernel_->add(11, fakeMetadata("fake:1"));
   const std::vector<std::string> told = lines();
   EXPECT_THAT(told, Contains(HasSubstr("metadata of DEV/video0, which is on the same bus")));
-  EXPECT_THAT(told, Contains("    metadata of no camera that is on the same bus"));
+  EXPECT_THAT(told, Contains("    metadata, but no camera is on the same bus"));
   EXPECT_EQ(binding_.cameras.size(), 1U);
 }
 
@@ -206,11 +206,11 @@ TEST_F(ProbeTest, TellsOfHidDevices) {
   EXPECT_THAT(told, Contains("    usage page 0xFF00, usage 0x0024"));
   EXPECT_THAT(told, Contains("    input reports 0x76 (792 bytes)"));
   EXPECT_THAT(told, Contains("    feature reports 0xAB (2 bytes), 0xAC (2 bytes)"));
-  EXPECT_THAT(told, Contains("  They need no binding: plug-ins look for them by usage page and usage."));
+  EXPECT_THAT(told, Contains("  They need no binding: plug-ins find them by usage page and usage."));
   EXPECT_THAT(told, Contains(HasSubstr("hidraw1 (Damaged)")));
-  EXPECT_THAT(told, Contains("    does not fit: No such file or directory"));
-  EXPECT_EQ(std::ranges::count_if(told, [](const auto& line) { return line.find("does not fit") != line.npos; }), 2);
-  EXPECT_THAT(told, Contains("    docs/linux.md has a udev rule that gives it to a group."));
+  EXPECT_THAT(told, Contains("    unsuitable: No such file or directory"));
+  EXPECT_EQ(std::ranges::count_if(told, [](const auto& line) { return line.find("unsuitable") != line.npos; }), 2);
+  EXPECT_THAT(told, Contains("    docs/linux.md has a udev rule that assigns it to a group."));
 }
 
 TEST_F(ProbeTest, TakesTheFirstConnectedDisplay) {
@@ -250,13 +250,13 @@ TEST_F(ProbeTest, BindsTheCountersThatThereAre) {
 
 TEST_F(ProbeTest, BindsNoTracepointThatIsNotThereOrMayNotBeCounted) {
   counters_->files = {{"/sys/kernel/tracing/events/v4l2/other/id", "7\n"}};
-  EXPECT_THAT(lines(), Not(Contains(HasSubstr("may not be counted"))));
+  EXPECT_THAT(lines(), Not(Contains(HasSubstr("may not count them"))));
   EXPECT_TRUE(binding_.tracepoints.empty());
   counters_->files = {{"/sys/kernel/tracing/events/v4l2/v4l2_dqbuf/id", "7\n"}};
   counters_->tracepointFailures = {{{7, 0}, EACCES}};
   EXPECT_THAT(lines(),
               testing::IsSupersetOf(
-                  {"    They may not be counted: perf_event_open on v4l2:v4l2_dqbuf failed: Permission denied "
+                  {"    This user may not count them: perf_event_open on v4l2:v4l2_dqbuf failed: Permission denied "
                    "(EACCES)",
                    "    The capability CAP_PERFMON, or a sysctl kernel.perf_event_paranoid of 0 or -1, allows it."}));
   EXPECT_TRUE(binding_.tracepoints.empty());

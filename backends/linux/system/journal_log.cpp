@@ -79,7 +79,7 @@ void JournalLog::write(LogLevel level, std::string_view subsystem, std::string_v
 void JournalLog::tellWhatWasDropped(std::string_view subsystem, std::string_view category) {
   const std::uint64_t dropped = dropped_.exchange(0);
   if (dropped == 0) return;
-  const std::string text = "the journal did not take " + std::to_string(dropped) + " log lines before this one";
+  const std::string text = "the journal did not accept " + std::to_string(dropped) + " log lines before this one";
   if (send(fieldsOf(LogLevel::kError, subsystem, category, text), false) != Outcome::kTaken) dropped_ += dropped;
 }
 

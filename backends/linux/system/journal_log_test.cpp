@@ -306,7 +306,7 @@ TEST_F(JournalLogTest, AJournalThatDoesNotReadIsWaitedForOnceAndToldWhatItMissed
   EXPECT_EQ(received(), "nothing");
   log.write(LogLevel::kDebug, "s", "c", "taken");
   EXPECT_THAT(received(), StartsWith("MESSAGE=taken\n"));
-  EXPECT_EQ(received(), "MESSAGE=the journal did not take 100 log lines before this one\n" + std::string(kRest));
+  EXPECT_EQ(received(), "MESSAGE=the journal did not accept 100 log lines before this one\n" + std::string(kRest));
   log.write(LogLevel::kDebug, "s", "c", "taken too");
   EXPECT_THAT(received(), StartsWith("MESSAGE=taken too\n"));
   EXPECT_EQ(received(), "nothing");
@@ -325,7 +325,7 @@ TEST_F(JournalLogTest, WhatWasMissedIsToldLaterWhenThereIsNoPlaceForIt) {
   EXPECT_EQ(received(), "nothing");
   log.write(LogLevel::kError, "s", "c", "next");
   EXPECT_THAT(received(), StartsWith("MESSAGE=next\n"));
-  EXPECT_THAT(received(), StartsWith("MESSAGE=the journal did not take 1 log lines"));
+  EXPECT_THAT(received(), StartsWith("MESSAGE=the journal did not accept 1 log lines"));
 }
 
 TEST_F(JournalLogTest, LinesOfSeveralThreadsArriveWhole) {

@@ -80,7 +80,7 @@ bool V4l2Device::lockExclusive(DiagnosticErrorPtr* error) {
   const int result = kernel_->lock(descriptor_);
   if (result >= 0) return true;
   if (result == -EWOULDBLOCK) {
-    failLinux(error, LinuxErrorCode::kBusy, path_ + " is in use by another process of this kind.");
+    failLinux(error, LinuxErrorCode::kBusy, path_ + " is in use by another quazor process.");
   } else {
     failSystemCall(error, "flock", path_, -result);
   }
@@ -147,7 +147,7 @@ bool V4l2Device::setFormat(std::uint32_t index, std::uint32_t width, std::uint32
   description.type = V4L2_BUF_TYPE_VIDEO_CAPTURE;
   const int result = call(VIDIOC_ENUM_FMT, &description);
   if (result == EINVAL) {
-    failLinux(error, LinuxErrorCode::kNotSupported, formatMessage("%@ has no format of index %@.", path_, index));
+    failLinux(error, LinuxErrorCode::kNotSupported, formatMessage("%@ has no format with index %@.", path_, index));
     return false;
   }
   if (result != 0) {
@@ -164,7 +164,7 @@ bool V4l2Device::setFormat(std::uint32_t index, std::uint32_t width, std::uint32
   const auto isGranted = [&](const v4l2_pix_format& given) {
     if (given.width == width && given.height == height && given.pixelformat == description.pixelformat) return true;
     failLinux(error, LinuxErrorCode::kNotSupported,
-              formatMessage("%@: format %@ (%@) of %@ x %@ is not to be had; the driver offers %@ of %@ x %@.", path_,
+              formatMessage("%@: format %@ (%@) of %@ x %@ is not available; the driver offers %@ of %@ x %@.", path_,
                             index, codeText(description.pixelformat), width, height, codeText(given.pixelformat),
                             given.width, given.height));
     return false;

@@ -219,7 +219,7 @@ TEST(OpenedVideoNodeTest, AFormatThatTheDriverChangesAsItIsSetIsRefused) {
   const std::string path = kernel->add(0, fakeCamera("fake:0"));
   const auto node = V4l2Device::open(kernel, path, nullptr);
   EXPECT_EQ(outcome([&](auto* error) { return node->setFormat(1, 640, 360, error); }),
-            "5 " + path + ": format 1 (GREY) of 640 x 360 is not to be had; the driver offers GREY of 640 x 352.");
+            "5 " + path + ": format 1 (GREY) of 640 x 360 is not available; the driver offers GREY of 640 x 352.");
 }
 
 TEST(OpenedVideoNodeTest, ADriverWithoutCapabilitiesOfItsNodesIsTakenByTheDevices) {

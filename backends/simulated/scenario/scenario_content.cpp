@@ -32,7 +32,7 @@ void checkId(const std::string& id, const JsonCursor& cursor) {
     return (c >= 'a' && c <= 'z') || (c >= 'A' && c <= 'Z') || (c >= '0' && c <= '9') || c == '-' || c == '_';
   };
   if (id.empty() || !std::ranges::all_of(id, fits)) {
-    cursor.fail("the id must be made of letters, digits, \"-\" and \"_\".");
+    cursor.fail("an id may only contain letters, digits, \"-\" and \"_\".");
   }
 }
 
@@ -63,7 +63,7 @@ std::vector<CameraFormat> readFormats(const JsonCursor& cursor) {
 std::set<std::uint64_t> readDroppedFrames(const JsonCursor& cursor) {
   std::set<std::uint64_t> frames;
   for (const JsonCursor& element : cursor.elements()) {
-    if (!frames.insert(element.integer(0, kMaxFrames)).second) element.fail("the frame stands twice; leave one.");
+    if (!frames.insert(element.integer(0, kMaxFrames)).second) element.fail("the frame is listed twice; remove one.");
   }
   return frames;
 }
@@ -114,7 +114,7 @@ CameraGroup readGroup(const std::string& id, const JsonCursor& cursor, const Sce
   for (const JsonCursor& element : cursor.at("cameras").elements()) {
     std::string camera = element.oneOf(cameras, "a camera of this scenario");
     if (std::ranges::find(group.cameras, camera) != group.cameras.end()) {
-      element.fail("the camera stands twice; leave one.");
+      element.fail("the camera is listed twice; remove one.");
     }
     group.cameras.push_back(std::move(camera));
   }

@@ -53,7 +53,7 @@ TEST(ScenarioContentTest, DevicesAndTheDisplayAreRead) {
 
 TEST(ScenarioContentTest, DevicesAreNamedAsCamerasAre) {
   EXPECT_EQ(problemOf(R"({"title": "t", "cameras": {}, "groups": {}, "hidDevices": {"a b": {}}})"),
-            "hidDevices.a b: the id must be made of letters, digits, \"-\" and \"_\".");
+            "hidDevices.a b: an id may only contain letters, digits, \"-\" and \"_\".");
 }
 
 TEST(ScenarioContentTest, FaultsMayNameDevicesReportsAndProperties) {
@@ -88,15 +88,16 @@ TEST(ScenarioContentTest, FaultsThatWouldNeverFireAreRefused) {
       {"a device that there is not", R"("operation": "HidDevice.open", "object": "nar")",
        "faults[0].object: \"nar\" is not an object of HidDevice.open; did you mean \"near\"?"},
       {"an operation on no device", R"("operation": "HidService.createManager", "object": "near")",
-       "faults[0].object: HidService.createManager is not called on a camera, a group or a HID device; leave it out."},
+       "faults[0].object: HidService.createManager has no object; remove this key."},
       {"a feature report that there is not", R"("operation": "HidDevice.setFeatureReportWithID", "property": "0xEE")",
-       "faults[0].property: \"0xEE\" is not a property of HidDevice.setFeatureReportWithID; known are \"0xAB\", "
+       "faults[0].property: \"0xEE\" is not a property of HidDevice.setFeatureReportWithID; expected one of \"0xAB\", "
        "\"0x01\", \"0xAC\"."},
       {"a property that there is not", R"("operation": "RegistryService.registryProperty", "property": "Colour")",
-       "faults[0].property: \"Colour\" is not a property of RegistryService.registryProperty; known are \"Power\", "
+       "faults[0].property: \"Colour\" is not a property of RegistryService.registryProperty; expected one of "
+       "\"Power\", "
        "\"Name\"."},
       {"a property where there is none", R"("operation": "HidDevice.open", "property": "0xAB")",
-       "faults[0].property: HidDevice.open is about no property; leave it out."},
+       "faults[0].property: HidDevice.open has no property; remove this key."},
   };
   for (const auto& row : kRows) EXPECT_EQ(problemOf(withFaultEntries(row.entries)), row.problem) << row.name;
 }

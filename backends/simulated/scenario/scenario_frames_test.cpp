@@ -94,10 +94,10 @@ TEST(ScenarioFramesTest, WhatIsWrongIsToldInOneSentence) {
     const char* text;
     const char* problem;
   } kRows[] = {
-      {projector, R"({"frame": {}})", R"(the document: there is no key "frame"; did you mean "frames"?)"},
+      {projector, R"({"frame": {}})", R"(the document: unknown key "frame"; did you mean "frames"?)"},
       {projector, R"({"metadata": {"a": []}})", "metadata.a: must be a number, a string, true or false, not an array."},
       {projector, R"({"metadata": 3})", "metadata: must be an object, not 3."},
-      {projector, R"({"without": [""]})", "without[0]: must be a string that is not empty, not \"\"."},
+      {projector, R"({"without": [""]})", "without[0]: must be a non-empty string, not \"\"."},
       {projector, R"({"attachment": "mising"})",
        R"(attachment: "mising" is not a kind of attachment; did you mean "missing"?)"},
       {projector, R"({"frames": {"07": {}}})",
@@ -107,7 +107,7 @@ TEST(ScenarioFramesTest, WhatIsWrongIsToldInOneSentence) {
       {projector, R"({"frames": {"1000000001": {}}})",
        R"(frames.1000000001: the key must be the number of a frame, from 0 to 1000000000.)"},
       {projector, R"({"frames": {"1": {"frames": {}}}})",
-       R"(frames.1: there is no key "frames"; known are "attachment", "metadata", "without".)"},
+       R"(frames.1: unknown key "frames"; expected one of "attachment", "metadata", "without".)"},
       {delivery, R"({"queues": 0})", "queues: must be an integer from 1 to 64, not 0."},
       {delivery, R"({"queues": 65})", "queues: must be an integer from 1 to 64, not 65."},
       {delivery, R"({"framesAfterStop": -1})", "framesAfterStop: must be an integer from 0 to 1000000000, not -1."},
@@ -124,7 +124,7 @@ TEST(ScenarioFramesTest, WhatIsWrongIsToldInOneSentence) {
       {reports, R"({"A": {"s": 1}})", "A.s: must be an object, not 1."},
       {reports, R"({"A": {"s": {"x": -1}}})", "A.s.x: must be an integer from 0 to 18446744073709551615, not -1."},
       {reports, R"({"A": {"s": {"x": "non"}}})", R"(A.s.x: "non" is not a count; did you mean "none"?)"},
-      {reports, R"({"A": {"s": {"x": {"grow": 1}}}})", R"(A.s.x: there is no key "grow"; did you mean "growth"?)"},
+      {reports, R"({"A": {"s": {"x": {"grow": 1}}}})", R"(A.s.x: unknown key "grow"; did you mean "growth"?)"},
       {reports, R"({"A": {"s": {"x": {"growthAt": [{"at": 1}]}}}})", R"(A.s.x.growthAt[0]: the key "by" is missing.)"},
   };
   for (const auto& row : kRows) {

@@ -36,7 +36,8 @@ class Loader {
     const fs::path baseFile = (file.parent_path() / base.text()).lexically_normal();
     open_.push_back(canonical(file));
     if (std::ranges::find(open_, canonical(baseFile)) != open_.end()) {
-      base.fail(inQuotes(base.text()) + " is based on this file in turn; a base must stand on its own.");
+      base.fail(inQuotes(base.text()) +
+                " is itself based on this file; scenarios must not be based on each other in a circle.");
     }
     Json patch = document.value();
     patch.erase("base");

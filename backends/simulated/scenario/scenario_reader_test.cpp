@@ -186,25 +186,22 @@ TEST_F(ScenarioReaderTest, TextsThatAreNoJsonAreRefusedWithTheirLine) {
     std::string text;
     const char* problem;
   } kRows[] = {
-      {"an empty file", "", "p.json:1: this is not JSON: unexpected end of input; expected '[', '{', or a literal."},
+      {"an empty file", "", "p.json:1: not valid JSON: unexpected end of input; expected '[', '{', or a literal."},
       {"a comma too many", "{\n  \"title\": \"t\",\n}",
-       "p.json:3: this is not JSON: unexpected '}'; expected string literal."},
+       "p.json:3: not valid JSON: unexpected '}'; expected string literal."},
       {"text behind the end", "{}\n\nmore",
-       "p.json:3: this is not JSON: invalid literal; last read: '{}<U+000A>"
+       "p.json:3: not valid JSON: invalid literal; last read: '{}<U+000A>"
        "<U+000A>m'; expected end of input."},
-      {"two documents", "{}\n{}", "p.json:2: this is not JSON: unexpected '{'; expected end of input."},
-      {"a missing end", "{\"title\": [1,\n2", "p.json:2: this is not JSON: unexpected end of input; expected ']'."},
+      {"two documents", "{}\n{}", "p.json:2: not valid JSON: unexpected '{'; expected end of input."},
+      {"a missing end", "{\"title\": [1,\n2", "p.json:2: not valid JSON: unexpected end of input; expected ']'."},
       {"a comment", "{ // why\n}",
-       "p.json:1: this is not JSON: invalid literal; last read: '{ /'; expected string "
+       "p.json:1: not valid JSON: invalid literal; last read: '{ /'; expected string "
        "literal."},
-      {"a byte that is no UTF-8", "{\n\"title\": \"\xFF\"}",
-       "p.json:2: this is not UTF-8; save the file in that encoding."},
-      {"a sequence that is too long", "{\"\xC0\x80\": 1}",
-       "p.json:1: this is not UTF-8; save the file in that encoding."},
-      {"a surrogate", "\"\xED\xA0\x80\"", "p.json:1: this is not UTF-8; save the file in that encoding."},
-      {"a code point that there is not", "\"\xF4\x90\x80\x80\"",
-       "p.json:1: this is not UTF-8; save the file in that encoding."},
-      {"a sequence that is cut off", "\"\xE2\x82", "p.json:1: this is not UTF-8; save the file in that encoding."},
+      {"a byte that is no UTF-8", "{\n\"title\": \"\xFF\"}", "p.json:2: the file is not valid UTF-8."},
+      {"a sequence that is too long", "{\"\xC0\x80\": 1}", "p.json:1: the file is not valid UTF-8."},
+      {"a surrogate", "\"\xED\xA0\x80\"", "p.json:1: the file is not valid UTF-8."},
+      {"a code point that there is not", "\"\xF4\x90\x80\x80\"", "p.json:1: the file is not valid UTF-8."},
+      {"a sequence that is cut off", "\"\xE2\x82", "p.json:1: the file is not valid UTF-8."},
   };
   for (const auto& row : kRows) EXPECT_EQ(problemOfText(row.text), row.problem) << row.name;
 }
@@ -224,30 +221,28 @@ TEST_F(ScenarioReaderTest, DocumentsThatMeanNothingAreRefusedWithTheirPath) {
       {"no object", "[]", "p.json:1: the document: must be an object, not an array."},
       {"no title", R"({"cameras": {}, "groups": {}})", "p.json:1: the document: the key \"title\" is missing."},
       {"an empty title", R"({"title": "", "cameras": {}, "groups": {}})",
-       "p.json:1: title: must be a string that is not empty, not \"\"."},
+       "p.json:1: title: must be a non-empty string, not \"\"."},
       {"no cameras", R"({"title": "t", "groups": {}})", "p.json:1: the document: the key \"cameras\" is missing."},
       {"no groups", R"({"title": "t", "cameras": {}})", "p.json:1: the document: the key \"groups\" is missing."},
       {"a key that was misspelt", with(R"("fault": [])"),
-       "p.json:2: the document: there is no key \"fault\"; did you mean \"faults\"?"},
+       "p.json:2: the document: unknown key \"fault\"; did you mean \"faults\"?"},
       {"a key that is far from any", with(R"("zzz": 1)"),
-       "p.json:2: the document: there is no key \"zzz\"; known are \"$schema\", \"title\", \"base\", \"device\", "
+       "p.json:2: the document: unknown key \"zzz\"; expected one of \"$schema\", \"title\", \"base\", \"device\", "
        "\"cameras\", \"groups\", \"reports\", \"hidDevices\", \"display\", \"faults\", \"expect\"."},
       {"a key twice", with(R"("device": {"present": true, "present": false})"),
-       "p.json:2: device: the key \"present\" stands twice; leave one of the two."},
-      {"a key twice at the top", with(R"("title": "again")"),
-       "p.json:2: the key \"title\" stands twice; leave one of the two."},
+       "p.json:2: device: the key \"present\" is duplicated; remove one."},
+      {"a key twice at the top", with(R"("title": "again")"), "p.json:2: the key \"title\" is duplicated; remove one."},
       {"a key twice in an array", withFault(R"("operation": "*", "action": "fail", "action": "hang")"),
-       "p.json:2: faults[0]: the key \"action\" stands twice; leave one of the two."},
+       "p.json:2: faults[0]: the key \"action\" is duplicated; remove one."},
       {"a number beyond a double", withCamera(R"("actualFrameRate": 1e999)"),
-       "p.json:1: cameras.a.actualFrameRate: the number is too large; a double must hold it."},
+       "p.json:1: cameras.a.actualFrameRate: the number is too large for a double."},
       {"nested too deep", std::string(40, '['), "p.json:1: the document is nested more than 32 deep."},
-      {"a schema that is no name", with(R"("$schema": 1)"),
-       "p.json:2: $schema: must be a string that is not empty, not 1."},
+      {"a schema that is no name", with(R"("$schema": 1)"), "p.json:2: $schema: must be a non-empty string, not 1."},
       {"a device that is no object", with(R"("device": true)"), "p.json:2: device: must be an object, not true."},
       {"a switch that is no boolean", with(R"("device": {"present": 1})"),
        "p.json:2: device.present: must be true or false, not 1."},
       {"an unknown part of the device", with(R"("device": {"presence": true})"),
-       "p.json:2: device: there is no key \"presence\"; did you mean \"present\"?"},
+       "p.json:2: device: unknown key \"presence\"; did you mean \"present\"?"},
   };
   for (const auto& row : kRows) EXPECT_EQ(problemOfText(row.text), row.problem) << row.name;
 }
@@ -259,9 +254,9 @@ TEST_F(ScenarioReaderTest, CamerasAndGroupsThatCannotBeAreRefused) {
     const char* problem;
   } kRows[] = {
       {"an id with a dot", R"({"title": "t", "cameras": {"a.b": {}}, "groups": {}})",
-       "p.json:1: cameras.a.b: the id must be made of letters, digits, \"-\" and \"_\"."},
+       "p.json:1: cameras.a.b: an id may only contain letters, digits, \"-\" and \"_\"."},
       {"an empty id", R"({"title": "t", "cameras": {"": {}}, "groups": {}})",
-       "p.json: cameras.: the id must be made of letters, digits, \"-\" and \"_\"."},
+       "p.json: cameras.: an id may only contain letters, digits, \"-\" and \"_\"."},
       {"no port", R"({"title": "t", "cameras": {"a": {"formats": []}}, "groups": {}})",
        "p.json:1: cameras.a: the key \"port\" is missing."},
       {"an unknown port", R"({"title": "t", "cameras": {"a": {"port": "BackFacingCammera"}}, "groups": {}})",
@@ -286,7 +281,7 @@ TEST_F(ScenarioReaderTest, CamerasAndGroupsThatCannotBeAreRefused) {
       {"frames that are no list", withCamera(R"("droppedFrames": 3)"),
        "p.json:1: cameras.a.droppedFrames: must be an array, not 3."},
       {"a frame twice", withCamera(R"("droppedFrames": [3, 4, 3])"),
-       "p.json:1: cameras.a.droppedFrames[2]: the frame stands twice; leave one."},
+       "p.json:1: cameras.a.droppedFrames[2]: the frame is listed twice; remove one."},
       {"every zeroth frame", withCamera(R"("dropEvery": 0)"),
        "p.json:1: cameras.a.dropEvery: must be an integer from 1 to 1000000000, not 0."},
       {"counters of another word", withCamera(R"("errorCounters": "unreadble")"),
@@ -300,11 +295,11 @@ TEST_F(ScenarioReaderTest, CamerasAndGroupsThatCannotBeAreRefused) {
       {"a group of a camera that there is not", withGroup(R"({"cameras": ["wide", "wyde"], "master": "wide"})"),
        "p.json:2: groups.g.cameras[1]: \"wyde\" is not a camera of this scenario; did you mean \"wide\"?"},
       {"a group of one camera twice", withGroup(R"({"cameras": ["wide", "wide"], "master": "wide"})"),
-       "p.json:2: groups.g.cameras[1]: the camera stands twice; leave one."},
+       "p.json:2: groups.g.cameras[1]: the camera is listed twice; remove one."},
       {"a master of another group", withGroup(R"({"cameras": ["wide"], "master": "tele"})"),
-       "p.json:2: groups.g.master: \"tele\" is not a camera of the group; known are \"wide\"."},
+       "p.json:2: groups.g.master: \"tele\" is not a camera of the group; expected one of \"wide\"."},
       {"an unknown part of a group", withGroup(R"({"cameras": ["wide"], "master": "wide", "masters": 1})"),
-       "p.json:2: groups.g: there is no key \"masters\"; did you mean \"master\"?"},
+       "p.json:2: groups.g: unknown key \"masters\"; did you mean \"master\"?"},
   };
   for (const auto& row : kRows) EXPECT_EQ(problemOfText(row.text), row.problem) << row.name;
 }
@@ -325,30 +320,29 @@ TEST_F(ScenarioReaderTest, FaultsThatWouldNeverFireAreRefused) {
        "p.json:2: faults[0].action: \"fial\" is not an action; did you mean \"fail\"?"},
       {"an object that there is not",
        withFault(R"("operation": "CaptureStream.start", "object": "b", "action": "fail")"),
-       "p.json:2: faults[0].object: \"b\" is not an object of CaptureStream.start; known are \"a\"."},
+       "p.json:2: faults[0].object: \"b\" is not an object of CaptureStream.start; expected one of \"a\"."},
       {"a group for a stream's operation",
        withFault(R"("operation": "CaptureStream.start", "object": "g", "action": "fail")"),
-       "p.json:2: faults[0].object: \"g\" is not an object of CaptureStream.start; known are \"a\"."},
+       "p.json:2: faults[0].object: \"g\" is not an object of CaptureStream.start; expected one of \"a\"."},
       {"an object where there is one only",
        withFault(R"("operation": "CapturePlugIn.device", "object": "a", "action": "fail")"),
-       "p.json:2: faults[0].object: CapturePlugIn.device is not called on a camera, a group or a HID device; leave it "
-       "out."},
+       "p.json:2: faults[0].object: CapturePlugIn.device has no object; remove this key."},
       {"a property that there is not",
        withFault(R"("operation": "CaptureStream.setValue", "property": "FormatIndx", "action": "fail")"),
        "p.json:2: faults[0].property: \"FormatIndx\" is not a property of CaptureStream.setValue; did you mean "
        "\"FormatIndex\"?"},
       {"a property of another object",
        withFault(R"("operation": "CaptureDevice.setValue", "property": "FormatIndex", "action": "fail")"),
-       "p.json:2: faults[0].property: \"FormatIndex\" is not a property of CaptureDevice.setValue; known are "
+       "p.json:2: faults[0].property: \"FormatIndex\" is not a property of CaptureDevice.setValue; expected one of "
        "\"MultiCamConfiguration\", \"MulticamSessionStatus\"."},
       {"a property where there is none",
        withFault(R"("operation": "CaptureStream.start", "property": "FormatIndex", "action": "fail")"),
-       "p.json:2: faults[0].property: CaptureStream.start is about no property; leave it out."},
+       "p.json:2: faults[0].property: CaptureStream.start has no property; remove this key."},
       {"the zeroth call", withFault(R"("operation": "*", "occurrence": 0, "action": "fail")"),
        "p.json:2: faults[0].occurrence: must be an integer from 1 to 1000000000, not 0."},
       {"an error of a hang",
        withFault(R"("operation": "*", "action": "hang", "error": {"domain": "D", "code": 1, "message": "M"})"),
-       "p.json:2: faults[0].error: only the action \"fail\" has an error."},
+       "p.json:2: faults[0].error: only the action \"fail\" can have an error."},
       {"an error without a code", withFault(R"("operation": "*", "action": "fail", "error": {"domain": "D"})"),
        "p.json:2: faults[0].error: the key \"code\" is missing."},
       {"an error with a code too large",
@@ -359,7 +353,7 @@ TEST_F(ScenarioReaderTest, FaultsThatWouldNeverFireAreRefused) {
       {"a delay into the past", withFault(R"("operation": "*", "action": "delay", "seconds": -1)"),
        "p.json:2: faults[0].seconds: must be a number above 0 and at most 1000000000.0, not -1."},
       {"seconds of a failure", withFault(R"("operation": "*", "action": "fail", "seconds": 1)"),
-       "p.json:2: faults[0].seconds: only the action \"delay\" has seconds."},
+       "p.json:2: faults[0].seconds: only the action \"delay\" can have seconds."},
       {"the second fault", with(R"("faults": [{"operation": "*", "action": "fail"}, 3])"),
        "p.json:2: faults[1]: must be an object, not 3."},
   };
@@ -367,7 +361,7 @@ TEST_F(ScenarioReaderTest, FaultsThatWouldNeverFireAreRefused) {
 }
 
 TEST_F(ScenarioReaderTest, FilesThatCannotBeReadAreRefused) {
-  EXPECT_EQ(problemOf(folder_ / "absent.json"), "absent.json: there is no such file.");
+  EXPECT_EQ(problemOf(folder_ / "absent.json"), "absent.json: the file does not exist.");
   write("file", "{}");
   fs::create_directories(folder_ / "folder");
   EXPECT_EQ(problemOf(folder_ / "folder"), "folder: this is a directory, not a file.");
@@ -409,21 +403,21 @@ TEST_F(ScenarioReaderTest, WhatIsWrongWithABaseIsFoundThere) {
     std::string text;
     const char* problem;
   } kRows[] = {
-      {"a base that there is not", R"({"base": "absent.json"})", "p.json:1: base: absent.json: there is no such file."},
-      {"a base that is no name", R"({"base": 1})", "p.json:1: base: must be a string that is not empty, not 1."},
+      {"a base that there is not", R"({"base": "absent.json"})",
+       "p.json:1: base: absent.json: the file does not exist."},
+      {"a base that is no name", R"({"base": 1})", "p.json:1: base: must be a non-empty string, not 1."},
       {"a base that is no JSON", R"({"base": "broken.json"})",
-       "p.json:1: base: broken.json:1: this is not JSON: unexpected end of input; expected string literal."},
+       "p.json:1: base: broken.json:1: not valid JSON: unexpected end of input; expected string literal."},
       {"a base that is no scenario", R"({"base": "empty.json", "cameras": {}})",
        "p.json:1: base: empty.json:1: the document: the key \"cameras\" is missing."},
       {"a change that does not fit", R"({"base": "good.json", "cameras": {"a": null}})",
        "p.json: groups.g.cameras[0]: \"a\" is not a camera of this scenario."},
       {"a base of itself", R"({"base": "self.json"})",
-       "p.json:1: base: self.json:1: base: \"./self.json\" is based on this file in turn; a base must stand on its "
-       "own."},
+       "p.json:1: base: self.json:1: base: \"./self.json\" is itself based on this file; scenarios must not be based "
+       "on each other in a circle."},
       {"bases in a circle", R"({"base": "one.json"})",
-       "p.json:1: base: one.json:1: base: two.json:1: base: \"one.json\" is based on this file in turn; a base must "
-       "stand "
-       "on its own."},
+       "p.json:1: base: one.json:1: base: two.json:1: base: \"one.json\" is itself based on this file; scenarios must "
+       "not be based on each other in a circle."},
   };
   for (const auto& row : kRows) EXPECT_EQ(problemOfText(row.text), row.problem) << row.name;
 }

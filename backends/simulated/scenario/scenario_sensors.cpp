@@ -25,7 +25,7 @@ std::uint8_t readByte(const JsonCursor& cursor) { return static_cast<std::uint8_
 
 std::uint8_t readReportID(const std::string& text, const JsonCursor& cursor) {
   if (const std::optional<std::uint8_t> id = hidReportNamed(text)) return *id;
-  cursor.fail(inQuotes(text) + " is not a report's ID; write it with two digits, like \"0x0A\".");
+  cursor.fail(inQuotes(text) + " is not a report ID; write it with two digits, like \"0x0A\".");
 }
 
 std::int32_t readSigned32(const JsonCursor& cursor) {
@@ -39,9 +39,9 @@ HidFeatureReport readFeatureReport(const std::string& id, const JsonCursor& curs
   report.id = readReportID(id, cursor);
   if (const auto accepts = cursor.find("accepts")) {
     for (const JsonCursor& value : accepts->elements()) {
-      if (!report.accepts.insert(readByte(value)).second) value.fail("the value stands twice; leave one.");
+      if (!report.accepts.insert(readByte(value)).second) value.fail("the value is listed twice; remove one.");
     }
-    if (report.accepts.empty()) accepts->fail("a feature report must take at least one value.");
+    if (report.accepts.empty()) accepts->fail("a feature report must accept at least one value.");
   }
   if (const auto value = cursor.find("streamsAt")) {
     report.streamsAt = readByte(*value);
@@ -62,7 +62,8 @@ HidReportShape readSingle(const JsonCursor& cursor) {
   HidReportShape shape;
   readShape(cursor, shape);
   if (const auto error = cursor.find("error")) {
-    if (shape.reportID || shape.length) error->fail("an error comes in place of a report, which then has no shape.");
+    if (shape.reportID || shape.length)
+      error->fail("an error replaces the report, so it cannot have \"reportID\" or \"length\".");
     shape.error = readFaultError(*error);
   }
   return shape;
@@ -73,7 +74,7 @@ void readInputReports(const JsonCursor& cursor, HidDeviceConfig& device) {
   if (const auto rate = cursor.find("rate")) device.rate = rate->positiveNumber(kMaxRate);
   if (const auto count = cursor.find("count")) device.reportCount = count->integer(0, kMaxReports);
   if (const auto removed = cursor.find("removedAfter")) {
-    if (device.reportCount) removed->fail("a device that is removed sends no more anyway; leave out \"count\".");
+    if (device.reportCount) removed->fail("\"removedAfter\" already ends the reports; remove \"count\".");
     device.removedAfter = removed->integer(0, kMaxReports);
   }
   readShape(cursor, device.every);
