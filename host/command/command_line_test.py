@@ -119,7 +119,7 @@ class RefusalTest(CommandLineTest):
                 path = self.directory / name if content is None else self.write(name, content)
                 result = quazor("run", "Fake.One", "--plugin", WORKING, "--phone", self.phone, "--output", self.output,
                                 "--profile", path)
-                self.assert_refused(result, 66, f"the profile '{path}'", problem)
+                self.assert_refused(result, 66, str(path), problem)
 
 
 class PluginTest(CommandLineTest):

@@ -142,7 +142,7 @@ TEST_F(Explain, WritesNothingWhenOneOfTheNamesHasNoExplanation) {
 
 TEST(ExplainWithoutExplanations, IsRefused) {
   std::ostringstream out;
-  EXPECT_THROW(explain({}, "/nowhere", false, out), CommandError);
+  EXPECT_THROW(explain({}, "/nowhere", false, out), InputError);
 }
 
 }  // namespace

@@ -144,7 +144,7 @@ TEST(ParseExplanations, RefusesWhatIsNotExactlyOfTheForm) {
       {"an unknown key of a message", with(full, R"("text")", R"("txt")"), "errors[0].messages[0]: unknown key"},
       {"a message from nobody", with(full, R"(["D"])", "[]"), "messages[0].from: at least one entry is required."},
       {"a message's empty meaning", with(full, "It was set so.", ""),
-       "errors[0].messages[0].meaning: must be a string"},
+       "errors[0].messages[0].meaning: must be a non-empty string"},
       {"an unknown key of a name", with(result, "failing", "fails"), "names[0]: unknown key \"fails\""},
       {"no name", with(result, R"(["R 1", "R 2"])", "[]"), "names[0].names: at least one entry is required."},
       {"an unknown kind", with(result, R"("result")", R"("results")"), "\"results\" is not a kind; did you mean"},

@@ -50,6 +50,9 @@ class SelectionTest : public testing::Test {
     } catch (const CommandError& refusal) {
       EXPECT_EQ(refusal.code(), code) << refusal.what();
       return refusal.what();
+    } catch (const InputError& problem) {  // of a file that was read
+      EXPECT_EQ(ExitCode::kCannotRead, code) << problem.what();
+      return problem.what();
     }
     return "accepted";
   }

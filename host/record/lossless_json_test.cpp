@@ -176,35 +176,35 @@ TEST(ValueFrom, RefusesWhatItDoesNotHold) {
       {"{}", "expected a value: an object with one key"},
       {R"({"signed":1,"double":1.0})", "expected a value: an object with one key"},
       {R"({"thing":1})", "unknown kind of value 'thing'"},
-      {R"({"boolean":1})", "there is no boolean"},
-      {R"({"signed":1.5})", "there is no integer"},
-      {R"({"signed":"1"})", "there is no integer"},
+      {R"({"boolean":1})", "expected a boolean"},
+      {R"({"signed":1.5})", "expected an integer"},
+      {R"({"signed":"1"})", "expected an integer"},
       {R"({"signed":9223372036854775808})", "integer too large"},
-      {R"({"unsigned":-1})", "there is no unsigned integer"},
-      {R"({"double":"NaN"})", "there is no number"},
-      {R"({"double":null})", "there is no number"},
-      {R"({"float":true})", "there is no number"},
-      {R"({"string":5})", "there is no string"},
+      {R"({"unsigned":-1})", "expected an unsigned integer"},
+      {R"({"double":"NaN"})", "expected a number"},
+      {R"({"double":null})", "expected a number"},
+      {R"({"float":true})", "expected a number"},
+      {R"({"string":5})", "expected a string"},
       {R"({"string":{"hax":"00"}})", "\"hex\" is missing"},
-      {R"({"string":{"hex":5}})", "there is no string"},
+      {R"({"string":{"hex":5}})", "expected a string"},
       {R"({"string":{"hex":"0"}})", "odd number of hexadecimal digits"},
       {R"({"string":{"hex":"0G"}})", "invalid hexadecimal digit"},
       {R"({"string":{"hex":"A0"}})", "invalid hexadecimal digit"},
-      {R"({"bytes":5})", "there is no string"},
+      {R"({"bytes":5})", "expected a string"},
       {R"({"bytes":"abc"})", "odd number of hexadecimal digits"},
-      {R"({"array":{}})", "there is not an array"},
+      {R"({"array":{}})", "expected an array"},
       {R"({"array":[5]})", "expected a value: an object with one key"},
-      {R"({"dictionary":{}})", "there is not an array"},
-      {R"({"dictionary":[5]})", "there is not an array"},
+      {R"({"dictionary":{}})", "expected an array"},
+      {R"({"dictionary":[5]})", "expected an array"},
       {R"({"dictionary":[["k"]]})", "expected an entry of a key and a value"},
-      {R"({"dictionary":[[5,{"signed":1}]]})", "there is no string"},
-      {R"({"date":1.0})", "there is no integer"},
-      {R"({"error":5})", "there is no object"},
+      {R"({"dictionary":[[5,{"signed":1}]]})", "expected a string"},
+      {R"({"date":1.0})", "expected an integer"},
+      {R"({"error":5})", "expected an object"},
       {R"({"error":{"code":1,"userInfo":[]}})", "\"domain\" is missing"},
       {R"({"error":{"domain":"D","userInfo":[]}})", "\"code\" is missing"},
       {R"({"error":{"domain":"D","code":1}})", "\"userInfo\" is missing"},
-      {R"({"error":{"domain":"D","code":"1","userInfo":[]}})", "there is no integer"},
-      {R"({"object":5})", "there is no string"},
+      {R"({"error":{"domain":"D","code":"1","userInfo":[]}})", "expected an integer"},
+      {R"({"object":5})", "expected a string"},
   };
   for (const Row& row : kRows) {
     EXPECT_THAT(problemOf([&] { valueFrom(Json::parse(row.json)); }), HasSubstr(row.problem)) << row.json;
@@ -217,20 +217,20 @@ TEST(ResultFrom, RefusesWhatIsNoResult) {
     const char* problem;
   };
   constexpr Row kRows[] = {
-      {"[]", "there is no object"},
+      {"[]", "expected an object"},
       {R"({"measurement":[1.0,"x"]})", "\"name\" is missing"},
       {R"({"name":"n"})", "\"measurement\" is missing"},
-      {R"({"name":"n","measurement":5})", "there is not an array"},
+      {R"({"name":"n","measurement":5})", "expected an array"},
       {R"({"name":"n","measurement":[1.0]})", "expected a measurement: a number and a unit"},
-      {R"({"name":"n","measurement":["x",1.0]})", "there is no number"},
-      {R"({"name":"n","measurement":[1.0,"x"],"limit":5})", "there is no object"},
+      {R"({"name":"n","measurement":["x",1.0]})", "expected a number"},
+      {R"({"name":"n","measurement":[1.0,"x"],"limit":5})", "expected an object"},
       {R"({"name":"n","measurement":[1.0,"x"],"limit":{"name":"l","upper":null}})", "\"lower\" is missing"},
       {R"({"name":"n","measurement":[1.0,"x"],"limit":{"name":"l","lower":null}})", "\"upper\" is missing"},
-      {R"({"name":"n","measurement":[1.0,"x"],"limit":{"name":"l","lower":5,"upper":null}})", "there is not an array"},
+      {R"({"name":"n","measurement":[1.0,"x"],"limit":{"name":"l","lower":5,"upper":null}})", "expected an array"},
       {R"({"name":"n","measurement":[1.0,"x"],"limit":{"name":"l","lower":[[1.0,"x"]],"upper":null}})",
        "expected a bound: a measurement and a boolean"},
       {R"({"name":"n","measurement":[1.0,"x"],"limit":{"name":"l","lower":null,"upper":[[1.0,"x"],1]}})",
-       "there is no boolean"},
+       "expected a boolean"},
   };
   for (const Row& row : kRows) {
     EXPECT_THAT(problemOf([&] { resultFrom(Json::parse(row.json)); }), HasSubstr(row.problem)) << row.json;
@@ -242,7 +242,7 @@ TEST(ValueFrom, RefusesWhatIsTooDeepInsteadOfRunningOutOfStack) {
   std::string text;
   for (std::size_t i = 0; i < kLevels; ++i) text += R"({"array":[)";
   for (std::size_t i = 0; i < kLevels; ++i) text += "]}";
-  EXPECT_THAT(problemOf([&] { valueFrom(Json::parse(text)); }), HasSubstr("too many levels"));
+  EXPECT_THAT(problemOf([&] { valueFrom(Json::parse(text)); }), HasSubstr("nested too deeply"));
 }
 
 TEST(MemberOf, TellsWhatIsMissing) {

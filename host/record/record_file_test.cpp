@@ -133,7 +133,8 @@ TEST_F(RecordFileTest, RefusesARecordThatWasChanged) {
   };
   EXPECT_THAT(refusalOfText(replaced(3, R"("sequence":3)", R"("sequence":4)")),
               HasSubstr("line 4: the sequence number is 4 instead of 3; a line is missing or has been moved"));
-  EXPECT_THAT(refusalOfText(replaced(3, R"("sequence":3)", R"("sequence":"3")")), HasSubstr("sequence number \"3\""));
+  EXPECT_THAT(refusalOfText(replaced(3, R"("sequence":3)", R"("sequence":"3")")),
+              HasSubstr("sequence number is \"3\""));
   EXPECT_THAT(refusalOfText(replaced(3, R"("sequence":3)", R"("number":3)")),
               HasSubstr("line 4: \"sequence\" is missing"));
   for (std::size_t i = 0; i + 1 < lines.size(); ++i) {
@@ -143,7 +144,7 @@ TEST_F(RecordFileTest, RefusesARecordThatWasChanged) {
   EXPECT_THAT(refusalOfText(changed([](auto& copy) { std::swap(copy[4], copy[5]); })), HasSubstr("line 5: "));
   EXPECT_THAT(refusalOfText(changed([](auto& copy) { copy[2] = "garbage"; })), HasSubstr("line 3: not valid JSON"));
   EXPECT_THAT(refusalOfText(changed([](auto& copy) { copy[2] = ""; })), HasSubstr("line 3: not valid JSON"));
-  EXPECT_THAT(refusalOfText(changed([](auto& copy) { copy[2] = "[2]"; })), HasSubstr("line 3: there is no object"));
+  EXPECT_THAT(refusalOfText(changed([](auto& copy) { copy[2] = "[2]"; })), HasSubstr("line 3: expected an object"));
   EXPECT_THAT(refusalOfText(replaced(2, "stageBegan", "stageBegun")), HasSubstr("line 3: unknown event 'stageBegun'"));
   EXPECT_THAT(refusalOfText(replaced(0, R"("record":1)", R"("record":2)")),
               HasSubstr("line 1: the record has format 2, but this program reads format 1"));

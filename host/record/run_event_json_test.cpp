@@ -193,7 +193,7 @@ TEST(EventFrom, SaysWhatIsWrong) {
     const char* problem;
   };
   constexpr BadRow kRows[] = {
-      {"5", "there is no object"},
+      {"5", "expected an object"},
       {R"({"event":5})", "\"event\" has the wrong type"},
       {R"({"event":"runbegan"})", "unknown event 'runbegan'"},
       {R"({"event":"stageBegan","stage":"pause","date":""})", "unknown stage 'pause'"},

@@ -145,13 +145,16 @@ TEST(ProblemsOf, TakesTheHostsWordThatItCouldNotWriteARecord) {
   const Failed notRecorded{std::nullopt, hostError(HostErrorCode::kNotRecorded, "the record cannot be written")};
   Events events = wholeRun();
   events.insert(find<DiagnosticEnded>(events, "Good"), notRecorded);
-  EXPECT_THAT(problemsOf(events), ElementsAre(HasSubstr("Good: the recorded verdict is pass, but error follows")));
+  EXPECT_THAT(
+      problemsOf(events),
+      ElementsAre(HasSubstr("Good: the recorded verdict is pass, but the results, limits and errors give error")));
   std::get<DiagnosticEnded>(*find<DiagnosticEnded>(events, "Good")).verdict = Verdict::kError;
   EXPECT_THAT(problemsOf(events), IsEmpty());
   const Failed another{std::nullopt, errorWithMessage("Domain", 10, "a plug-in's", nullptr)};
   *find<Failed>(events, "Good") = another;
   EXPECT_THAT(problemsOf(events),
-              testing::Contains(HasSubstr("Good: the recorded verdict is error, but pass follows")));
+              testing::Contains(
+                  HasSubstr("Good: the recorded verdict is error, but the results, limits and errors give pass")));
 }
 
 TEST(ProblemsOf, FindsEventsThatAreOutOfPlace) {
