@@ -270,7 +270,8 @@ void CameraSession::finish() {
 }
 
 void CameraSession::abandon() {
-  for (auto stream = streams_.rbegin(); stream != streams_.rend(); ++stream) (*stream)->stop(nullptr);
+  for (auto stream = streams_.rbegin(); stream != streams_.rend(); ++stream)
+    static_cast<void>((*stream)->stop(nullptr));
   relinquish();
 }
 
