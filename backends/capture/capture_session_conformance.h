@@ -70,11 +70,11 @@ TYPED_TEST_P(CaptureSessionConformance, AHandlerThatOwnsADeviceMayGoInEveryWay) 
          CaptureUser::set(user.wide(), capture_key::VideoOutputHandlers, capture_sample::primary(Dictionary{}));
        }},
       {"given back", [](CaptureUser& user) { user.relinquish({user.streams[0]}); }},
-      {"invalidated", [](CaptureUser& user) { user.device->invalidate(nullptr); }},
+      {"invalidated", [](CaptureUser& user) { static_cast<void>(user.device->invalidate(nullptr)); }},
       {"invalidated while it streams",
        [](CaptureUser& user) {
          user.start(0);
-         user.device->invalidate(nullptr);
+         static_cast<void>(user.device->invalidate(nullptr));
        }},
       {"with the last reference",
        [](CaptureUser& user) {
