@@ -26,6 +26,14 @@ using testing::ElementsAre;
 using testing::HasSubstr;
 using testing::IsEmpty;
 
+#if defined(__SANITIZE_ADDRESS__) || defined(__SANITIZE_THREAD__)
+constexpr bool kHasSanitizer = true;
+#elif defined(__has_feature)
+constexpr bool kHasSanitizer = __has_feature(address_sanitizer) || __has_feature(thread_sanitizer);
+#else
+constexpr bool kHasSanitizer = false;
+#endif
+
 std::filesystem::path plugin(const std::string& name) {
   return std::filesystem::path(QUAZOR_TEST_PLUGINS) / (name + "_plugin.so");
 }
@@ -388,9 +396,7 @@ TEST_F(RunTest, EndsWhenTheUserInterruptsIt) {
 }
 
 TEST_F(RunTest, EndsAPluginThatTakesMoreMemoryThanItMay) {
-#if defined(__SANITIZE_ADDRESS__) || defined(__SANITIZE_THREAD__)
-  GTEST_SKIP() << "the sanitizer's own memory is more than any limit";
-#endif
+  if (kHasSanitizer) GTEST_SKIP() << "the sanitizer's own memory is more than any limit";
   options_.memory = std::uint64_t{2} << 30;
   const DiagnosticRecord record = runUnruly(11);
   EXPECT_EQ(textOf(record.error), "QuazorHostErrorDomain 2 run of UnrulyExperiment threw an exception: std::bad_alloc");
