@@ -6,7 +6,7 @@
 #include "backends/linux/video/projector_guard.h"
 #include "backends/simulated/scenario/scenario.h"
 #include "backends/simulated/simulated_phone.h"
-#include "backends/threads/system_log.h"
+#include "backends/log/system_log.h"
 #include "base/json/json_cursor.h"
 #include "base/text/input_error.h"
 

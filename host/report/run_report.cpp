@@ -1,6 +1,6 @@
 #include "host/report/run_report.h"
 
-#include "backends/threads/standard_error_log.h"
+#include "backends/log/standard_error_log.h"
 #include "host/report/text_report.h"
 #include "host/system/output_file.h"
 #include "host/text/table.h"

@@ -38,7 +38,8 @@ ALLOWED = {
     "diagnostics/projector_fault": [*CONTRACT, "diagnostics/report_channels"],
     "diagnostics/sensor_images": CONTRACT,
     "plugins": [*CONTRACT, *DIAGNOSTICS],
-    "backends/threads": [*CONTRACT, "base/text"],
+    "backends/log": [*CONTRACT, "base/text"],
+    "backends/threads": CONTRACT,
     "backends/capture": CONTRACT,
     "backends/faults": [*CONTRACT, "backends/capture", "base/json", "base/text"],
     "backends/counters": CONTRACT,
@@ -50,7 +51,7 @@ ALLOWED = {
     SIMULATED + "counters": [*CONTRACT, "backends/counters", SIMULATED + "capture", SIMULATED + "scenario"],
     SIMULATED + "display": [*CONTRACT, SIMULATED + "scenario"],
     SIMULATED + "hid": [*CONTRACT, "backends/faults", "backends/hid", SIMULATED + "capture", SIMULATED + "scenario"],
-    LINUX + "system": [*CONTRACT, "backends/threads"],
+    LINUX + "system": [*CONTRACT, "backends/log", "backends/threads"],
     LINUX + "binding": [*CONTRACT, "backends/faults", "base/json", "base/text"],
     LINUX + "video": [*CONTRACT, LINUX + "binding", LINUX + "system"],
     LINUX + "capture": [*CONTRACT, "backends/capture", LINUX + "binding", LINUX + "system", LINUX + "video"],
@@ -76,7 +77,7 @@ HOST = ["error", "text", "device", "plugin", "system", "model", "record", "repor
 for index, name in enumerate(HOST):
     ALLOWED["host/" + name] = [*CONTRACT, "base/json", "base/text", *("host/" + below for below in HOST[:index])]
 ALLOWED["host/device"] += BACKENDS
-ALLOWED["host/report"] += ["backends/threads"]
+ALLOWED["host/report"] += ["backends/log"]
 ALLOWED["host"] = [*CONTRACT, *parts("host")]
 ALLOWED["host/testing"] = ALLOWED["host"]
 ALLOWED["host/testing/plugins"] = CONTRACT

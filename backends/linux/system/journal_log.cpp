@@ -1,6 +1,6 @@
 #include "backends/linux/system/journal_log.h"
 
-#include "backends/threads/system_log.h"
+#include "backends/log/system_log.h"
 
 #include <fcntl.h>
 #include <sys/mman.h>

@@ -1,6 +1,6 @@
-#include "backends/threads/tee_log.h"
+#include "backends/log/tee_log.h"
 
-#include "backends/threads/recording_log.h"
+#include "backends/log/recording_log.h"
 
 #include <gmock/gmock.h>
 #include <gtest/gtest.h>

@@ -1,4 +1,4 @@
-#include "backends/threads/standard_error_log.h"
+#include "backends/log/standard_error_log.h"
 
 #include "contract/message_format.h"
 

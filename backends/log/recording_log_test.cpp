@@ -1,4 +1,4 @@
-#include "backends/threads/recording_log.h"
+#include "backends/log/recording_log.h"
 
 #include <gmock/gmock.h>
 #include <gtest/gtest.h>

@@ -1,4 +1,4 @@
-#include "backends/threads/tee_log.h"
+#include "backends/log/tee_log.h"
 
 #include <utility>
 

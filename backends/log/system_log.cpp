@@ -1,4 +1,4 @@
-#include "backends/threads/system_log.h"
+#include "backends/log/system_log.h"
 
 #include "base/text/utf8.h"
 
