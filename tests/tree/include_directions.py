@@ -72,10 +72,21 @@ ALLOWED["backends/simulated"] = [*CONTRACT, "backends/capture", "backends/faults
 ALLOWED["backends/linux"] = [*CONTRACT, "backends/faults", "backends/threads", *parts("backends/linux")]
 BACKENDS = [name for name in ALLOWED if name.startswith("backends/")]
 
-# The host's folders, lower ones first: each may include only those before it.
-HOST = ["error", "text", "device", "plugin", "system", "model", "record", "report", "run", "cli", "command"]
-for index, name in enumerate(HOST):
-    ALLOWED["host/" + name] = [*CONTRACT, "base/json", "base/text", *("host/" + below for below in HOST[:index])]
+# The host's folders, lower ones first.
+for name, below in {
+    "error": [],
+    "text": ["error"],
+    "system": ["error"],
+    "device": ["error", "text"],
+    "plugin": ["error", "text"],
+    "model": ["device", "error", "plugin", "text"],
+    "record": ["error", "model", "text"],
+    "report": ["device", "error", "model", "plugin", "record", "system", "text"],
+    "run": ["device", "error", "model", "plugin", "record", "report", "system", "text"],
+    "cli": ["device", "error", "plugin", "report", "run", "text"],
+    "command": ["cli", "device", "error", "model", "plugin", "record", "report", "run", "system", "text"],
+}.items():
+    ALLOWED["host/" + name] = [*CONTRACT, "base/json", "base/text", *("host/" + folder for folder in below)]
 ALLOWED["host/device"] += BACKENDS
 ALLOWED["host/report"] += ["backends/log"]
 ALLOWED["host"] = [*CONTRACT, *parts("host")]
