@@ -34,6 +34,13 @@ function(quazor_configure target)
       target_compile_options(${target} PRIVATE -fno-sanitize=vptr)
     endif()
     target_link_options(${target} PRIVATE -fsanitize=${QUAZOR_SANITIZE})
+    # Compilers disagree on how code may ask.
+    foreach(sanitizer address thread)
+      if(QUAZOR_SANITIZE MATCHES ${sanitizer})
+        string(TOUPPER ${sanitizer} word)
+        target_compile_definitions(${target} PRIVATE QUAZOR_${word}_SANITIZER)
+      endif()
+    endforeach()
   endif()
   if(QUAZOR_COVERAGE)
     # Several threads count at once.

@@ -106,12 +106,8 @@ TEST(ThreadSerialQueueTest, AQueueThatIsDroppedEndsItsThread) {
 }
 
 TEST(ThreadSerialQueueTest, AnIdleQueueGivesBackTheMemoryOfItsBusiestMoment) {
-#if defined(__SANITIZE_ADDRESS__) || defined(__SANITIZE_THREAD__)
+#if defined(QUAZOR_ADDRESS_SANITIZER) || defined(QUAZOR_THREAD_SANITIZER)
   GTEST_SKIP() << "a sanitizer's allocator does not tell what is in use";
-#elif defined(__has_feature)
-#if __has_feature(address_sanitizer) || __has_feature(thread_sanitizer)
-  GTEST_SKIP() << "a sanitizer's allocator does not tell what is in use";
-#endif
 #endif
   constexpr std::size_t kTasks = 20'000;
   constexpr std::size_t kMinimum = kTasks * sizeof(Task);

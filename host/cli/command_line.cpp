@@ -195,7 +195,7 @@ std::uint64_t parseWhole(const char* option, const std::string& text, std::uint6
 std::optional<std::uint64_t> memoryOf(const std::string& text) {
   if (text == "none") return std::nullopt;
   if (!text.empty()) return parseWhole("--memory", text, 1, UINT64_MAX / kMebibyte) * kMebibyte;
-#if defined(__SANITIZE_ADDRESS__) || defined(__SANITIZE_THREAD__)
+#if defined(QUAZOR_ADDRESS_SANITIZER) || defined(QUAZOR_THREAD_SANITIZER)
   return std::nullopt;  // sanitizers reserve a larger address space than any limit
 #else
   return kDefaultMebibytes * kMebibyte;

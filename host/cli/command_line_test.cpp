@@ -53,7 +53,7 @@ TEST(ParseCommandLine, KnowsItsDefaults) {
   EXPECT_TRUE(options->report.outputs.empty());
   EXPECT_EQ(options->report.shownLog, LogLevel::kError);
   EXPECT_TRUE(options->deadlines.empty());
-#if !defined(__SANITIZE_ADDRESS__) && !defined(__SANITIZE_THREAD__)
+#if !defined(QUAZOR_ADDRESS_SANITIZER) && !defined(QUAZOR_THREAD_SANITIZER)
   EXPECT_EQ(options->memory, std::uint64_t{4096} * 1024 * 1024);
 #endif
   EXPECT_FALSE(options->inProcess);

@@ -21,8 +21,7 @@ from steps import STEPS, Step
 
 ROOT = pathlib.Path(__file__).resolve().parent.parent.parent
 RELEASE = ("-DCMAKE_BUILD_TYPE=Release",)
-SANITIZED = ("-DCMAKE_BUILD_TYPE=RelWithDebInfo", "-DCMAKE_CXX_FLAGS_RELWITHDEBINFO=-O1 -g1",
-             "-DQUAZOR_SANITIZE=address,undefined")
+SANITIZED = ("--preset", "sanitized")
 MEMORY, SANITIZED_MEMORY = 512, 2048  # MiB
 BOOT_SECONDS = 100  # of processor time, until a machine counts as hanging
 SANITIZED_SLOWNESS = 4

@@ -20,10 +20,8 @@ namespace {
 // those that are tried are tried in every order all the same.
 bool isThorough() { return std::getenv("QUAZOR_THOROUGH") != nullptr; }
 
-#if defined(__SANITIZE_THREAD__)
+#if defined(QUAZOR_THREAD_SANITIZER)
 constexpr bool kHasThreadSanitizer = true;
-#elif defined(__has_feature)
-constexpr bool kHasThreadSanitizer = __has_feature(thread_sanitizer);
 #else
 constexpr bool kHasThreadSanitizer = false;
 #endif

@@ -7,18 +7,11 @@
 #include <new>
 #include <utility>
 
-#if defined(__has_feature)
-#define QUAZOR_HAS_FEATURE(feature) __has_feature(feature)
-#else
-#define QUAZOR_HAS_FEATURE(feature) 0
-#endif
-#if defined(__SANITIZE_ADDRESS__) || QUAZOR_HAS_FEATURE(address_sanitizer)
-#define QUAZOR_ADDRESS_SANITIZER 1
+#ifdef QUAZOR_ADDRESS_SANITIZER
 #include <sanitizer/asan_interface.h>
 #include <sanitizer/common_interface_defs.h>
 #endif
-#if defined(__SANITIZE_THREAD__) || QUAZOR_HAS_FEATURE(thread_sanitizer)
-#define QUAZOR_THREAD_SANITIZER 1
+#ifdef QUAZOR_THREAD_SANITIZER
 #include <sanitizer/tsan_interface.h>
 #endif
 
