@@ -196,6 +196,10 @@ def main():
     system = system_archive(kernel)
     plans = plans_of(steps, "boot", [system, project_archive(directory)], MEMORY, 1)
     if options.sanitized:
+        long = [step.name for step in steps if step.soak and step.name not in options.steps]
+        if long:
+            say(f"left out with sanitizers, where it takes minutes: {', '.join(long)} (name it to run it)")
+        steps = [step for step in steps if step.name not in long]
         plans += plans_of(steps, "sanitized", [system, project_archive(options.sanitized.resolve())], SANITIZED_MEMORY,
                           SANITIZED_SLOWNESS)
     passed = run_plans(plans, kernel, directory / "kernel-rig")

@@ -15,6 +15,7 @@ class Step:
     check: typing.Callable  # takes an Arrived; raises CheckFailed
     boot: int = 1  # in which of the boots it runs
     limit: int = 60  # seconds of guest time until it counts as hanging
+    soak: bool = False  # with sanitizers only when it is named: it takes minutes there
 
 
 STEPS = [
@@ -39,7 +40,7 @@ STEPS = [
     Step("projector_unlit", "the light fails: error 206", cameras.projector_unlit, boot=2),
     Step("projector_unsafe", "the light is off for safety: error 213", cameras.projector_unsafe, boot=2),
     Step("projector_killed", "the light is off when a process is killed", cameras.projector_killed, boot=2),
-    Step("sensor_30s", "60 images a second for 30 s, without loss", sensors.sensor_30s, boot=2, limit=90),
+    Step("sensor_30s", "60 images a second for 30 s, without loss", sensors.sensor_30s, boot=2, limit=90, soak=True),
     Step("sensor_faults", "no sensor, two, silent, refusing, removed, pausing, with long reports",
          sensors.sensor_faults, boot=2),
     Step("display_off", "no images while the display is dark or unplugged", sensors.display_off, boot=2),
