@@ -17,7 +17,7 @@ namespace quazor {
 
 namespace {
 
-// Tells of the plug-ins that could not be loaded, and what that makes of the exit code.
+// Reports the plug-ins that could not be loaded and returns the resulting exit code.
 ExitCode reportFailed(const std::vector<FailedPlugin>& failed, Console& console, ExitCode otherwise) {
   for (const FailedPlugin& plugin : failed) {
     console.err << "quazor: " << printable(plugin.error->localizedDescription()) << '\n';
@@ -26,7 +26,7 @@ ExitCode reportFailed(const std::vector<FailedPlugin>& failed, Console& console,
 }
 
 ExitCode list(const Options& options, const Installation& installation, Console& console) {
-  // A diagnostic's summary is known without making anything of it.
+  // The summary of a diagnostic is known without a description; that of an experiment is not.
   const auto aloneAndUnused = [](std::vector<Diagnostic> all) {
     std::erase_if(all, [](const Diagnostic& one) { return !one.experimentOnly || !one.usedBy.empty(); });
     return all;
@@ -117,7 +117,7 @@ ExitCode runProgram(const std::vector<std::string>& arguments, const Installatio
     return perform(*options, installation, console);
   } catch (const CommandError& error) {
     return refused(error, error.code());
-  } catch (const InputError& error) {  // of a file that was read
+  } catch (const InputError& error) {  // from reading a file
     return refused(error, ExitCode::kCannotRead);
   }
 }

@@ -47,7 +47,7 @@ class Doctor {
   }
 
  private:
-  // `look` returns what there is, or throws the InputError that says what is wrong.
+  // `look` returns a description of what it found, or throws an InputError with the reason for the refusal.
   void check(std::string_view kind, const std::string& name, const std::function<std::string()>& look) {
     try {
       tell(true, kind, name, look());
@@ -62,7 +62,7 @@ class Doctor {
                  << printable(finding) << '\n';
   }
 
-  // Each is loaded alone, so that one that cannot be loaded does not hide another.
+  // Loads each plug-in alone: one that cannot be loaded must not hide another.
   std::string findingOfPlugin(const std::filesystem::path& plugin) const {
     Options alone = options_;
     alone.plugins = {plugin};

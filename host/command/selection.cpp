@@ -40,7 +40,7 @@ std::vector<Profile> profilesOf(const Options& options, const Installation& inst
   std::vector<Profile> profiles;
   if (!options.withoutProfile && options.profile.empty()) {
     profiles.push_back(readProfile(installation.defaultProfile()));
-    profiles.back().mayNameOthers = true;  // it is for whatever plug-ins may be loaded
+    profiles.back().mayNameOthers = true;  // the installed profile serves any set of plug-ins
   }
   if (options.recorded) profiles.push_back(*options.recorded);
   if (!options.withoutProfile && !options.profile.empty()) profiles.push_back(readProfile(options.profile));
@@ -48,7 +48,7 @@ std::vector<Profile> profilesOf(const Options& options, const Installation& inst
   return profiles;
 }
 
-// Asks for the descriptions without which the profiles cannot be checked.
+// Requests the descriptions that are needed to check the profiles.
 void describeDoubts(const Options& options, const Installation& installation, const std::vector<Profile>& profiles,
                     std::vector<DescribedDiagnostic>& catalogue) {
   std::vector<Diagnostic> doubts;
@@ -57,7 +57,7 @@ void describeDoubts(const Options& options, const Installation& installation, co
     doubts.insert(doubts.end(), more.begin(), more.end());
   }
   if (doubts.empty()) return;
-  if (options.inProcess) {  // where they are loaded already
+  if (options.inProcess) {  // the plug-ins are already loaded
     for (DescribedDiagnostic& one : catalogue) {
       if (contains(doubts, one.diagnostic)) one.description = describeDiagnostic(one.diagnostic);
     }

@@ -92,7 +92,7 @@ class Selftest {
     if (!expected.experimentOnly) return resolveParameters(described, {profile_}, {});
     std::vector<ParameterOverride> settings;
     for (const auto& [name, value] : expected.parameters) {
-      // As it would stand on a command line: a whole number is an integer.
+      // Formats the value like on a command line, where a whole number is an integer.
       settings.push_back(parseOverride(formatMessage("%@=%@", name, value)));
     }
     return resolveParameters(described, {}, settings);

@@ -10,7 +10,7 @@ namespace quazor {
 
 namespace {
 
-// Why the bound cannot be compared with the measurement; empty when it can.
+// Why the bound cannot be compared with the measurement; empty if it can.
 std::string problemOfBound(std::string_view which, const QZBound& bound, const Measurement& measured) {
   const Measurement& value = bound.value();
   if (!std::isfinite(value.value())) return formatMessage("its %@ bound is %@", which, value.value());

@@ -15,7 +15,7 @@ namespace quazor {
 
 namespace {
 
-// How a setting is called in messages: where it stands, and its text.
+// A setting as messages quote it: its source and its text.
 std::string quoted(OverridePlace place, const std::string& text) {
   const std::string where = place == OverridePlace::kEnvironment ? kSettingsVariable : "--set";
   return where + " '" + text + "'";
@@ -27,7 +27,7 @@ std::string_view sourceOf(OverridePlace place) {
 
 constexpr Part kHalves[] = {Part::kExperiment, Part::kAnalysis};
 
-// What several of them are called.
+// The noun for a list of them.
 std::string nounOf(const std::vector<DescribedDiagnostic>& diagnostics) {
   const auto isExperiment = [](const DescribedDiagnostic& one) { return one.diagnostic.experimentOnly; };
   if (std::all_of(diagnostics.begin(), diagnostics.end(), isExperiment)) return "experiments";
@@ -44,7 +44,7 @@ bool sets(const ParameterOverride& setting, Part half, std::string_view name) {
   return (!setting.half || *setting.half == half) && setting.name == name;
 }
 
-// The names that the diagnostics declare in that half or, without one, in any.
+// The names of the parameters that the diagnostics declare in that part or, without one, in any.
 std::vector<std::string> declaredNames(const std::vector<DescribedDiagnostic>& diagnostics, std::optional<Part> half) {
   std::vector<std::string> names;
   for (const DescribedDiagnostic& diagnostic : diagnostics) {
@@ -86,7 +86,7 @@ void checkEntry(const Profile& profile, const ProfileEntry& entry, const std::ve
   }
 }
 
-// What of the catalogue an entry of diagnostics, or one of experiments, fits.
+// The diagnostics or, with `ofExperiments`, the experiments that the entry matches.
 std::vector<DescribedDiagnostic> matchesOf(const ProfileEntry& entry, const std::vector<DescribedDiagnostic>& catalogue,
                                            bool ofExperiments) {
   std::vector<DescribedDiagnostic> matched;
@@ -97,7 +97,7 @@ std::vector<DescribedDiagnostic> matchesOf(const ProfileEntry& entry, const std:
   return matched;
 }
 
-// True when each parameter that the entry sets is declared by one of the diagnostics.
+// True if one of the diagnostics declares each parameter that the entry sets.
 bool declareAll(const std::vector<DescribedDiagnostic>& diagnostics, const ProfileEntry& entry) {
   for (const Part half : kHalves) {
     const std::vector<std::string> names = declaredNames(diagnostics, half);
@@ -108,21 +108,21 @@ bool declareAll(const std::vector<DescribedDiagnostic>& diagnostics, const Profi
   return true;
 }
 
-// Adds those of the matches that are in doubt.
+// Adds the undescribed matches if the described ones do not declare every parameter of the entry.
 void addDiagnosticsToDescribe(const ProfileEntry& entry, const std::vector<DescribedDiagnostic>& matched,
                               std::vector<Diagnostic>& doubts) {
   std::vector<DescribedDiagnostic> asked;
   std::copy_if(matched.begin(), matched.end(), std::back_inserter(asked),
                [](const DescribedDiagnostic& one) { return one.description.isAsked; });
   const auto couldNot = [](const DescribedDiagnostic& one) { return one.description.error != nullptr; };
-  // Without one that is asked, the entry does not matter; with one whose parameters are not known, it is passed over.
+  // An entry that matches nothing selected does not matter. checkProfile skips an entry with a failed description.
   if (asked.empty() || std::any_of(asked.begin(), asked.end(), couldNot) || declareAll(asked, entry)) return;
   for (const DescribedDiagnostic& one : matched) {
     if (!one.description.isAsked && !contains(doubts, one.diagnostic)) doubts.push_back(one.diagnostic);
   }
 }
 
-// Checks the entries of diagnostics or those of experiments.
+// Checks the entries for diagnostics or those for experiments.
 void checkEntries(const Profile& profile, const std::vector<ProfileEntry>& entries,
                   const std::vector<DescribedDiagnostic>& catalogue, bool ofExperiments) {
   for (const ProfileEntry& entry : entries) {

@@ -288,7 +288,7 @@ TEST(BindParameters, TakesTheValueOfTheLastPlaceThatHasOne) {
     EXPECT_EQ(bound.experiment[0].value, row.value) << row.source;
     EXPECT_EQ(bound.experiment[0].source, row.source);
   }
-  // What the later places do not hold is the earlier ones'.
+  // A later source without a value keeps the earlier one's.
   const ResolvedParameters bound = resolveParameters(fault(), profiles, {environment, commandLine});
   EXPECT_EQ(bound.experiment[1].value, Value(1));
   EXPECT_EQ(bound.experiment[1].source, "profile default.json");

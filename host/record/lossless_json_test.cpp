@@ -17,7 +17,7 @@ namespace {
 using Json = nlohmann::ordered_json;
 using testing::HasSubstr;
 
-// As a record keeps it: as text, in which nothing had to be replaced.
+// Formats and parses it, like a record. The formatting replaces nothing.
 Json throughText(const Json& json) { return Json::parse(json.dump()); }
 
 Value back(const Value& value) { return valueFrom(throughText(losslessValue(value))); }
@@ -41,7 +41,7 @@ TEST(LosslessValue, KeepsEveryValue) {
 }
 
 TEST(LosslessValue, KeepsFloatsOfEveryKind) {
-  // One in 80,021, which is a prime: every sign, every exponent, and mantissas of all kinds.
+  // Every 80,021st number. The step is prime, so all signs and exponents and many kinds of mantissas occur.
   std::uint64_t count = 0;
   for (std::uint64_t bits = 0; bits <= UINT32_MAX; bits += 80'021) {
     const Value value(std::bit_cast<float>(static_cast<std::uint32_t>(bits)));

@@ -95,7 +95,7 @@ TEST(Progress, KeepsTheCounterOfFramesNoLongerThanTheRun) {
   const auto watched = std::make_shared<int>(0);
   const auto count = [watched] { return std::uint64_t{7}; };
   progress.countFrames(count);
-  EXPECT_EQ(watched.use_count(), 2);  // nothing runs: only `count` has it
+  EXPECT_EQ(watched.use_count(), 2);  // nothing is running, so only `count` holds it
   progress.start("Name", {});
   progress.countFrames(count);
   EXPECT_EQ(watched.use_count(), 3);

@@ -197,7 +197,7 @@ class RunTest : public IsolationTest {
     runOptions_.makePhone = [] { return std::make_unique<TestPhone>(); };
   }
 
-  // What the events of a run in a process of its own come to.
+  // Runs in a separate process and returns the record of the events.
   DiagnosticRecord run(const std::string& pluginName, const std::string& name,
                        const std::vector<std::string>& texts = {}, const QZExperimentResult* result = nullptr) {
     options_.plugins = {plugin(pluginName)};
@@ -226,7 +226,7 @@ class RunTest : public IsolationTest {
     options_.deadlines = {{Stage::kRun, 1min}};
     return run("unruly", "Unruly", {"way=" + std::to_string(way)});
   }
-  // The same for a way that takes longer than its deadline.
+  // Like run(), with a way of misbehaving that exceeds the deadline.
   DiagnosticRecord runUnrulyForTooLong(int way) {
     options_.deadlines = {{Stage::kRun, 100ms}};
     return run("unruly", "Unruly", {"way=" + std::to_string(way)});
@@ -296,7 +296,7 @@ TEST_F(RunTest, LoadsOnlyThePluginsThatTheDiagnosticNeeds) {
     return textOf(builder.takeRecord().error);
   };
   EXPECT_EQ(runNow("Fake.One", {"fatal", "working", "combining"}), "");
-  // Its plug-in has another diagnostic, with a half that is not loaded.
+  // Its plug-in has another diagnostic whose analysis is not loaded.
   EXPECT_EQ(runNow("Combining.Own", {"fatal", "working", "combining"}), "");
   EXPECT_EQ(runNow("Combined", {"fatal", "working", "combining"}), "");
   EXPECT_EQ(runNow("Combined", {"combining"}), "QuazorHostErrorDomain 3 the plug-ins no longer register Combined");
@@ -337,7 +337,7 @@ TEST_F(RunTest, TurnsEachEndOfItsProcessIntoAFailureOfTheStage) {
     EXPECT_EQ(record.errorStage, Stage::kRun) << row.name;
     EXPECT_FALSE(isCompleted_) << row.name;
     EXPECT_TRUE(goesOn_) << row.name;
-    // What came before is kept.
+    // Earlier stages are kept.
     EXPECT_EQ(record.stages.size(), 4U) << row.name;
     EXPECT_EQ(logOf(record)[0], "an error line") << row.name;
   }
@@ -408,7 +408,7 @@ TEST_F(RunTest, ShowsTheFramesOfThePhoneInTheOtherProcess) {
   class SlowPhone final : public Phone {
    public:
     Platform platform() const override {
-      ::usleep(450'000);  // past the time for which nothing is shown
+      ::usleep(450'000);  // longer than the delay before progress is shown
       return nullPlatform();
     }
     std::vector<DeclaredFault> faults() const override { return {}; }

@@ -25,13 +25,13 @@ namespace {
 using namespace std::chrono_literals;
 using testing::HasSubstr;
 
-// Waits for the child's end, at most a minute.
+// Waits up to a minute for the child to end.
 std::string endOf(ChildProcess& child) {
   for (int i = 0; i < 60'000 && !child.end(); ++i) std::this_thread::sleep_for(1ms);
   return child.end() ? textOf(*child.end()) : "it has not ended";
 }
 
-// What can be read from the descriptor until its other end is closed, or until `octets` have come.
+// Reads from the descriptor until the other end is closed or `octets` bytes have arrived.
 std::string readAll(int descriptor, std::size_t octets = SIZE_MAX) {
   std::string text;
   while (text.size() < octets) {
@@ -202,7 +202,7 @@ TEST_F(ChildProcessTest, GoesWithEverythingThatItStarted) {
   EXPECT_EQ(::kill(orphan, 0), -1);
 }
 
-// A process that ended left a guard, which takes so long to put the light out. Returns whether it did.
+// A process ends and leaves a cleanup process that needs `duration` to switch the light off. Returns whether it did.
 bool goesDark(const WatchedSignals& signals, std::chrono::milliseconds duration) {
   static std::chrono::milliseconds takes;
   takes = duration;

@@ -1,4 +1,4 @@
-// A plug-in for tests of the host: its diagnostic takes frames from the phone's first camera.
+// A plug-in for tests of the host: its diagnostic receives frames from the phone's first camera.
 #include "contract/lab.h"
 #include "host/testing/plugins/fake_diagnostic.h"
 #include "platform/capture_keys.h"
@@ -15,7 +15,7 @@ namespace quazor::fake {
 
 namespace {
 
-// Parameters: "frameCount", how many frames it waits for; "timeout", which it only declares.
+// Parameters: "frameCount", the number of frames to wait for; "timeout", which has no effect.
 class StreamingExperiment final : public QZExperiment {
  public:
   QZDescription experimentDescription() const override {

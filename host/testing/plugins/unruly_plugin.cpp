@@ -1,4 +1,4 @@
-// A plug-in for tests of the host: diagnostics that do not go by the rules, each in its own way.
+// A plug-in for tests of the host: diagnostics that violate the contract, each in a different way.
 #include "contract/lab.h"
 #include "contract/log_channel.h"
 #include "host/testing/plugins/fake_diagnostic.h"
@@ -17,14 +17,14 @@ namespace quazor::fake {
 
 namespace {
 
-// Where quazor's processes have their connection.
+// The descriptor of the connection in quazor's child processes.
 constexpr int kConnection = 250;
 
 void tell(std::string_view text) {
   if (::write(kConnection, text.data(), text.size()) < 0) ::_exit(99);
 }
 
-// The values of the parameter "way".
+// Misbehaves according to the parameter "way".
 void goWrong(int way) {
   switch (way) {
     case 1: std::abort();
