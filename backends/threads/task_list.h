@@ -7,7 +7,7 @@
 //   [ address of a segment | claimed slots, 0 to kSlots | asleep ]
 //
 // 1. A producer claims a slot by incrementing the count with a compare-and-exchange. No other thread accesses a claimed
-//    slot, and its segment is not reused, until the slot has been published and consumed. No other protection is needed.
+//    slot or reuses its segment until the slot has been published and consumed, so it needs no other protection.
 // 2. The producer moves its task there and publishes the slot with the slot's own flag. The consumer takes slots in the
 //    order of the claims, so it waits for a slot that is claimed but not yet published.
 // 3. The thread that claims the last slot of a segment links the next segment and moves the tail there before it

@@ -29,7 +29,7 @@ CameraInfo infoOf(const CameraBinding& binding) {
   return info;
 }
 
-// Below it no interval can be told to a driver.
+// A lower rate cannot be expressed as an interval.
 constexpr double kMinRate = 0.01;
 
 }  // namespace
@@ -88,7 +88,7 @@ bool LinuxCamera::applyRates(const CameraSettings& wanted, DiagnosticErrorPtr* e
   return !agree || intervalOf(wanted, error);
 }
 
-// Sets what the rates ask for. Without any rate, the driver keeps its own, which it may be unable to tell.
+// Sets the requested rates. Without a rate the driver's own interval remains, which may be unknown.
 std::optional<FrameInterval> LinuxCamera::intervalOf(const CameraSettings& settings, DiagnosticErrorPtr* error) {
   const auto& [minimum, maximum] = std::tie(settings.minimumRate, settings.maximumRate);
   if (!minimum && !maximum) return node_->interval(nullptr).value_or(FrameInterval());
@@ -115,7 +115,7 @@ bool LinuxCamera::applyAutoExposure(const CameraSettings& wanted, DiagnosticErro
                        node_->path());
   }
   if (control != nullptr) {
-    // Of the automatic ways, cameras have this or that; the driver's default is one that it has.
+    // Cameras support different automatic modes. The driver's default is one that this camera supports.
     constexpr std::int64_t kManual = V4L2_EXPOSURE_MANUAL;
     constexpr std::int64_t kAutomatic = V4L2_EXPOSURE_AUTO;
     const std::int64_t automatic = control->usual == kManual ? kAutomatic : control->usual;
@@ -136,7 +136,7 @@ bool LinuxCamera::checkLightSource(const CameraSettings& wanted, DiagnosticError
   return true;
 }
 
-// What lights the projector; nothing in mode 0, which keeps it dark. What is switched on comes last.
+// The controls that switch the projector on, in order; empty for mode 0, in which it stays dark.
 std::vector<ControlSetting> LinuxCamera::lightOf(const Value& configuration) const {
   std::vector<ControlSetting> settings;
   if (!binding_.projector || !toBoolean(entryOf(&configuration, capture_key::Mode))) return settings;

@@ -56,7 +56,7 @@ bool CameraRun::light(DiagnosticErrorPtr* error) {
   return node_->set(light_, error);
 }
 
-// The guard, as it ends, puts the light out once more.
+// Destroying the guard also switches the projector off.
 bool CameraRun::darken(DiagnosticErrorPtr* error) {
   if (guard_ == nullptr) return true;
   const bool dark = node_->set(camera_.projector->off, error);
@@ -135,7 +135,7 @@ bool CameraRun::serve(std::span<const pollfd> polled) {
   }
   bool goesOn = polled[0].revents == 0 || serveVideo(polled[0]);
   if (!goesOn) pairing_.endMetadata();
-  // A handler may end the stream.
+  // A handler may stop the stream.
   while (video_ != nullptr) {
     std::optional<CapturedFrame> frame = pairing_.next(video_->node().kernel().now());
     if (!frame) return goesOn;
@@ -144,7 +144,7 @@ bool CameraRun::serve(std::span<const pollfd> polled) {
   return false;
 }
 
-// False when the node delivers no more.
+// False if the node delivers no more buffers.
 bool CameraRun::serveMetadata(const pollfd& polled) {
   for (std::size_t i = 0; i < metadata_->count(); ++i) {
     DequeuedBuffer buffer;
@@ -162,8 +162,7 @@ bool CameraRun::serveMetadata(const pollfd& polled) {
   return true;
 }
 
-// False when the camera delivers no more. An event without a buffer means that too: to wait again would be to wait
-// for what is there already.
+// False if the camera delivers no more frames. That includes an event without a buffer, which would recur at once.
 bool CameraRun::serveVideo(const pollfd& polled) {
   for (std::size_t i = 0; i < video_->count(); ++i) {
     DequeuedBuffer buffer;
@@ -200,7 +199,7 @@ void CameraRun::hand(const CapturedFrame& frame) {
     ++counts_.missingMetadata;
   }
   delivered_->fetch_add(1, std::memory_order_relaxed);
-  const std::shared_ptr<PixelBufferHandler> handler = handler_;  // it may end the stream, which lets go of it
+  const std::shared_ptr<PixelBufferHandler> handler = handler_;  // keeps the handler alive if it stops the stream
   (*handler)(buffer, mediaTimeOf(frame.timestamp));
   buffer.release();
 }

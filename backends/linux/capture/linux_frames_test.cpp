@@ -1,4 +1,4 @@
-// Streaming over a made-up driver: what handlers get, what is counted, how every failure ends.
+// Streaming with a fake driver: frames, counters and every failure.
 #include "backends/linux/capture/camera_frames.h"
 #include "backends/linux/capture/linux_capture_for_tests.h"
 #include "backends/linux/video/v4l2_device.h"

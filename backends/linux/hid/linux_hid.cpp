@@ -27,14 +27,14 @@ class KernelCalls final : public HidrawCalls {
     return ::read(descriptor, room.data(), room.size());
   }
   int setFeature(int descriptor, std::span<const std::uint8_t> report) override {
-    // The request's number holds the length; the kernel takes the bytes as its own to change.
+    // The request number contains the length. The kernel may modify the bytes, so it gets a copy.
     std::vector<std::uint8_t> bytes(report.begin(), report.end());
     return ::ioctl(descriptor, HIDIOCSFEATURE(bytes.size()), bytes.data());
   }
   std::chrono::nanoseconds now() override { return std::chrono::steady_clock::now().time_since_epoch(); }
 };
 
-// Bits of a request's number are left for the length.
+// The request number has a limited number of bits for the length.
 constexpr std::size_t kMaxFeatureLength = (std::size_t{1} << _IOC_SIZEBITS) - 1;
 
 std::optional<HidUsage> primaryUsage(const HidrawNode& node) {
@@ -63,7 +63,7 @@ class LinuxHidDevice final : public HidDevice {
       failSystemCall(error, "open", name(), number);
       return false;
     }
-    // The path may now belong to another device.
+    // The path may belong to another device by now.
     const std::filesystem::path opened = hidrawDevice(roots_, node_.path);
     if (opened.empty()) return refuse(error, LinuxErrorCode::kDeviceGone, "has been removed");
     if (opened != node_.device) {
@@ -88,7 +88,7 @@ class LinuxHidDevice final : public HidDevice {
     int sent = -1;
     do {
       sent = calls_->setFeature(descriptor->get(), payload);
-    } while (sent < 0 && errno == EINTR);  // a signal is no answer
+    } while (sent < 0 && errno == EINTR);  // a signal does not end the request
     if (sent >= 0) return true;
     tellFailedFeature(reportID, errno, calls_->now() - begin, error);
     return false;
@@ -106,7 +106,7 @@ class LinuxHidDevice final : public HidDevice {
     return false;
   }
 
-  // EIO is the answer of a device that refuses, and, after a while, that of the kernel for one that does not answer.
+  // EIO means that the device refused or, after several seconds, that it did not respond.
   void tellFailedFeature(std::uint8_t reportID, int number, std::chrono::nanoseconds time,
                          DiagnosticErrorPtr* error) const {
     const std::string call = "HIDIOCSFEATURE of report " + std::to_string(reportID);

@@ -36,7 +36,7 @@ class LinuxHidTest : public ::testing::Test {
     made->enumerateDevicesMatching(matching);
     return made->devices();
   }
-  // The names of the nodes that one of the dictionaries matches.
+  // The names of the nodes that match one of the dictionaries.
   std::vector<std::string> found(const std::vector<Dictionary>& matching) {
     std::vector<std::string> names;
     for (const auto& device : find(matching)) {
@@ -49,7 +49,7 @@ class LinuxHidTest : public ::testing::Test {
     tree_.connect("hidraw0", sensorDescriptor());
     return find().at(0);
   }
-  // With the folder of this run's devices as "/dev".
+  // The text of the error, with "/dev" for the directory of this test's devices.
   std::string textOf(const DiagnosticErrorPtr& error) const {
     std::string text = defaultText(error);
     const std::string folder = tree_.roots().devices;
@@ -273,7 +273,7 @@ TEST_F(LinuxHidTest, ADeviceThatIsDroppedWhileItIsScheduledLeavesItsLoop) {
   EXPECT_EQ(loop.runInMode(kRunLoopDefaultMode, 10s, false), RunLoopResult::kFinished);
 }
 
-// The kernel's own calls, on files that are no HID devices.
+// The system's own calls, on files that are not HID devices.
 TEST(HidrawCallsTest, TheyAskTheSystem) {
   const std::shared_ptr<HidrawCalls> calls = makeHidrawCalls();
   EXPECT_FALSE(calls->open("/no/such/device"));

@@ -19,11 +19,11 @@ constexpr std::array kPorts{port_type::BackFacingCamera, port_type::BackFacingTe
                             port_type::BackFacingSuperWideCamera, port_type::FrontFacingCamera,
                             port_type::FrontFacingInfraredCamera};
 constexpr double kDefaultRate = 30;
-// What is chosen of a camera that offers any size, and the most that is chosen of others.
+// The size for a camera that supports any size, and the maximum for others.
 constexpr std::uint32_t kDefaultWidth = 640;
 constexpr std::uint32_t kDefaultHeight = 480;
 constexpr std::uint64_t kMaxPixels = std::uint64_t{1920} * 1080;
-constexpr std::uint32_t kMaxSide = 65536;  // that a binding can name
+constexpr std::uint32_t kMaxSide = 65536;  // the maximum of a binding
 
 bool reachesUsualRate(const FrameSize& size) {
   bool below = false;
@@ -63,7 +63,7 @@ std::vector<std::string> sizeTexts(const VideoFormat& format) {
   return texts;
 }
 
-// Formats that follow each other and have the same sizes are told together.
+// Consecutive formats with equal sizes share one line.
 void tellFormats(const std::vector<VideoFormat>& formats, std::vector<std::string>* lines) {
   for (std::size_t begin = 0; begin < formats.size();) {
     const std::vector<std::string> sizes = sizeTexts(formats[begin]);
@@ -85,7 +85,7 @@ void tellControls(const std::vector<VideoControl>& controls, std::vector<std::st
   if (!names.empty()) lines->push_back("    controls: " + names);
 }
 
-// The size that a binding begins with: the largest one at the usual rate, or the largest one.
+// The size for the starter binding: the largest one at the default rate, or the largest one.
 std::optional<std::pair<std::uint32_t, std::uint32_t>> chosenSize(const VideoNodeDetails& details) {
   std::optional<std::pair<std::uint32_t, std::uint32_t>> chosen;
   std::pair<bool, std::uint64_t> best;

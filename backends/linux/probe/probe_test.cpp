@@ -39,7 +39,7 @@ class ProbeTest : public ::testing::Test {
     binding_ = readBinding(folder_ / "binding.json");
     return found;
   }
-  // The lines that the probe tells, without the folder of the made-up devices.
+  // The lines of the probe, without the directory of the fake devices.
   std::vector<std::string> lines() {
     std::vector<std::string> lines = probe().lines;
     const std::string dev = kernel_->roots().dev.string();
@@ -62,7 +62,7 @@ class ProbeTest : public ::testing::Test {
   const std::shared_ptr<FakeV4l2Api> kernel_ = std::make_shared<FakeV4l2Api>();
   const std::shared_ptr<FakeCounters> counters_ = std::make_shared<FakeCounters>();
   HidrawRoots hid_{folder_ / "no sysfs", folder_};
-  Binding binding_;  // what was suggested last
+  Binding binding_;  // the last suggestion
 };
 
 TEST_F(ProbeTest, TellsOfAMachineWithNothing) {

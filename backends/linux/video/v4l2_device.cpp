@@ -11,10 +11,10 @@
 namespace quazor {
 namespace {
 
-// Drivers list some hundreds of controls or formats at most; one that goes on for ever must not hold us.
+// Drivers list some hundreds of controls or formats at most; the limit stops one that never ends its list.
 constexpr std::uint32_t kMaxItems = 4096;
 
-// A text of the driver in a field of fixed size, which it may fill to the last byte.
+// The four characters of a pixel format.
 std::string codeText(std::uint32_t code) {
   std::string text;
   for (int shift = 0; shift < 32; shift += 8) text += static_cast<char>(code >> shift & 0x7f);
@@ -117,12 +117,12 @@ std::vector<FrameSize> V4l2Device::sizesOf(std::uint32_t code) const {
     size.highestHeight = discrete ? size.height : entry.stepwise.max_height;
     listIntervals(code, size);
     sizes.push_back(std::move(size));
-    if (!discrete) break;  // such a driver has this one entry
+    if (!discrete) break;  // otherwise the range is the only entry
   }
   return sizes;
 }
 
-// Of a range of sizes, those of the lowest.
+// For a range of sizes, lists the intervals of the smallest size.
 void V4l2Device::listIntervals(std::uint32_t code, FrameSize& size) const {
   for (std::uint32_t index = 0; index < kMaxItems; ++index) {
     v4l2_frmivalenum entry{};
@@ -160,7 +160,7 @@ bool V4l2Device::setFormat(std::uint32_t index, std::uint32_t width, std::uint32
   wanted.fmt.pix.height = height;
   wanted.fmt.pix.pixelformat = description.pixelformat;
   wanted.fmt.pix.field = V4L2_FIELD_ANY;
-  // The answer to the second may differ from that to the first, when something else of the device has changed.
+  // VIDIOC_S_FMT may return another format than VIDIOC_TRY_FMT if other settings of the device changed in between.
   const auto isGranted = [&](const v4l2_pix_format& given) {
     if (given.width == width && given.height == height && given.pixelformat == description.pixelformat) return true;
     failLinux(error, LinuxErrorCode::kNotSupported,

@@ -12,7 +12,7 @@
 namespace quazor {
 namespace {
 
-// N of "videoN"; nothing for other names (radios, sub-devices).
+// The N of "videoN"; nothing for other names (radios, sub-devices).
 std::optional<std::uint32_t> numberOf(std::string_view name) {
   constexpr std::string_view kPrefix = "video";
   if (!name.starts_with(kPrefix)) return std::nullopt;

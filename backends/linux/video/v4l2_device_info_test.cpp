@@ -92,7 +92,7 @@ TEST(VideoNodesTest, DetailsAreFormatsWithSizesAndIntervalsAndControls) {
   EXPECT_EQ(details->controls[0].usual, 12);
 }
 
-// A driver that answers with ranges.
+// A driver that reports ranges.
 class RangesKernel final : public FakeV4l2Api {
  public:
   int ioctl(int descriptor, unsigned long request, void* argument) override {
