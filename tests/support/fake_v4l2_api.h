@@ -26,8 +26,8 @@ namespace quazor {
 struct FakeControl {
   std::uint32_t id = 0;
   std::string name;
-  std::int64_t lowest = 0;
-  std::int64_t highest = 255;
+  std::int64_t minimum = 0;
+  std::int64_t maximum = 255;
   std::int64_t value = 0;
   std::uint32_t type = V4L2_CTRL_TYPE_INTEGER;
   std::uint32_t flags = 0;
@@ -40,8 +40,8 @@ struct FakeSize {
 };
 
 struct FakeFormat {
-  std::uint32_t code = 0;
-  std::string text;
+  std::uint32_t fourcc = 0;
+  std::string description;
   std::vector<FakeSize> sizes;
 };
 

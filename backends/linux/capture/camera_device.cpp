@@ -118,7 +118,7 @@ bool LinuxCamera::applyAutoExposure(const CameraSettings& wanted, DiagnosticErro
     // Cameras support different automatic modes. The driver's default is one that this camera supports.
     constexpr std::int64_t kManual = V4L2_EXPOSURE_MANUAL;
     constexpr std::int64_t kAutomatic = V4L2_EXPOSURE_AUTO;
-    const std::int64_t automatic = control->usual == kManual ? kAutomatic : control->usual;
+    const std::int64_t automatic = control->defaultValue == kManual ? kAutomatic : control->defaultValue;
     return node_->set(*control, isAutomatic ? automatic : kManual, error);
   }
   return true;
@@ -130,7 +130,7 @@ bool LinuxCamera::checkLightSource(const CameraSettings& wanted, DiagnosticError
     if (control == nullptr) return false;
     if (!takes(*control, setting.value)) {
       return refuseLinux(error, LinuxErrorCode::kBadValue, "%@: the control \"%@\" takes %@ to %@, not %@.", port(),
-                         control->name, control->lowest, control->highest, setting.value);
+                         control->name, control->minimum, control->maximum, setting.value);
     }
   }
   return true;

@@ -306,7 +306,7 @@ TEST(LinuxFramesTest, WhatTheSystemRefusesAtTheStartLeavesNothingBusy) {
        "5 NODE has no control \"Gain\"."},
       {"a control that puts the projector out",
        [](Fake& fake) {
-         fake.kernel->with(fake.nodes[kInfrared], [](FakeNode& node) { return node.controls[0].highest = 1; });
+         fake.kernel->with(fake.nodes[kInfrared], [](FakeNode& node) { return node.controls[0].maximum = 1; });
        },
        "done"},
   };

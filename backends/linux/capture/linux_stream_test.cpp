@@ -215,7 +215,7 @@ TEST(LinuxStreamTest, AProjectorsSetOfBitsTakesEveryNumber) {
   fake.kernel->with(fake.nodes[3], [](FakeNode& node) {
     FakeControl& power = *std::ranges::find(node.controls, kPower, &FakeControl::id);
     power.type = V4L2_CTRL_TYPE_BITMASK;
-    return power.highest = 0;
+    return power.maximum = 0;
   });
   ASSERT_EQ(fake.take(3), "done");
   EXPECT_EQ(fake.set(fake.infrared(), capture_key::InfraredLightSourceConfiguration, Fake::light(2, 0, 5)), "done");

@@ -27,8 +27,7 @@ class Walk {
   // Called for each match, with the texts that the placeholders matched. Returns false to stop.
   using OnFound = std::function<bool(const std::string& file, const ChannelNames& names)>;
 
-  Walk(CounterSystem& system, std::string_view path, OnFound found)
-      : system_(system), found_(std::move(found)) {
+  Walk(CounterSystem& system, std::string_view path, OnFound found) : system_(system), found_(std::move(found)) {
     for (std::size_t begin = 1; begin <= path.size();) {
       const std::size_t end = std::min(path.find('/', begin), path.size());
       components_.emplace_back(path.substr(begin, end - begin));

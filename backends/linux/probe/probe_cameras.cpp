@@ -51,8 +51,8 @@ std::string ratesText(const FrameSize& size) {
 
 std::string sizeText(const FrameSize& size) {
   std::string text = formatMessage("%@x%@", size.width, size.height);
-  if (size.highestWidth > size.width || size.highestHeight > size.height) {
-    text += formatMessage(" to %@x%@", size.highestWidth, size.highestHeight);
+  if (size.maximumWidth > size.width || size.maximumHeight > size.height) {
+    text += formatMessage(" to %@x%@", size.maximumWidth, size.maximumHeight);
   }
   return text + " at " + ratesText(size);
 }
@@ -69,10 +69,10 @@ void tellFormats(const std::vector<VideoFormat>& formats, std::vector<std::strin
     const std::vector<std::string> sizes = sizeTexts(formats[begin]);
     std::size_t end = begin;
     std::string codes;
-    for (; end < formats.size() && sizeTexts(formats[end]) == sizes; ++end) codes += " " + formats[end].code;
+    for (; end < formats.size() && sizeTexts(formats[end]) == sizes; ++end) codes += " " + formats[end].fourcc;
     lines->push_back(
         end - begin == 1
-            ? formatMessage("    format %@:%@ (%@)", formats[begin].index, codes, formats[begin].text)
+            ? formatMessage("    format %@:%@ (%@)", formats[begin].index, codes, formats[begin].description)
             : formatMessage("    formats %@ to %@:%@", formats[begin].index, formats[end - 1].index, codes));
     for (const std::string& size : sizes) lines->push_back("      " + size);
     begin = end;
@@ -91,8 +91,8 @@ std::optional<std::pair<std::uint32_t, std::uint32_t>> chosenSize(const VideoNod
   std::pair<bool, std::uint64_t> best;
   if (details.formats.empty()) return chosen;
   for (const FrameSize& size : details.formats.front().sizes) {
-    const std::uint32_t width = std::clamp(kDefaultWidth, size.width, std::max(size.width, size.highestWidth));
-    const std::uint32_t height = std::clamp(kDefaultHeight, size.height, std::max(size.height, size.highestHeight));
+    const std::uint32_t width = std::clamp(kDefaultWidth, size.width, std::max(size.width, size.maximumWidth));
+    const std::uint32_t height = std::clamp(kDefaultHeight, size.height, std::max(size.height, size.maximumHeight));
     if (std::min(width, height) == 0 || std::max(width, height) > kMaxSide) continue;
     const std::uint64_t pixels = std::uint64_t{width} * height;
     const std::pair<bool, std::uint64_t> worth{reachesUsualRate(size), pixels <= kMaxPixels ? pixels : 1};

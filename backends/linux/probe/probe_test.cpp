@@ -132,7 +132,7 @@ TEST_F(ProbeTest, ChoosesTheLargestSizeAtTheUsualRate) {
   };
   for (const auto& row : kRows) {
     FakeNode node = fakeCamera("fake:0");
-    node.formats = {{node.formats[0].code, "format", row.sizes}};
+    node.formats = {{node.formats[0].fourcc, "format", row.sizes}};
     kernel_->add(0, node);
     const std::vector<std::string> told = lines();
     ASSERT_EQ(binding_.cameras.size(), 1U) << row.what;
@@ -176,7 +176,7 @@ TEST_F(ProbeTest, BindsNoCameraThatABindingCannotName) {
   nameless.card.clear();
   kernel_->add(0, nameless);
   FakeNode absurd = fakeCamera("fake:1");
-  absurd.formats = {{absurd.formats[0].code, "format", {{0, 0, {{1, 30}}}, {70000, 1, {{1, 30}}}}}};
+  absurd.formats = {{absurd.formats[0].fourcc, "format", {{0, 0, {{1, 30}}}, {70000, 1, {{1, 30}}}}}};
   kernel_->add(1, absurd);
   const std::vector<std::string> told = lines();
   EXPECT_THAT(told, Contains(HasSubstr("reports nothing that a binding could use to identify it")));

@@ -73,8 +73,8 @@ class V4l2Device final {
   V4l2Device(std::shared_ptr<V4l2Api> kernel, std::string path, int descriptor);
 
   void listControls();
-  std::vector<FrameSize> sizesOf(std::uint32_t code) const;
-  void listIntervals(std::uint32_t code, FrameSize& size) const;
+  std::vector<FrameSize> sizesOf(std::uint32_t fourcc) const;
+  void listIntervals(std::uint32_t fourcc, FrameSize& size) const;
 
   const std::shared_ptr<V4l2Api> kernel_;
   const std::string path_;

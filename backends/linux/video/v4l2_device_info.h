@@ -28,16 +28,16 @@ struct FrameInterval {
 struct FrameSize {
   std::uint32_t width = 0;
   std::uint32_t height = 0;
-  std::uint32_t highestWidth = 0;
-  std::uint32_t highestHeight = 0;
+  std::uint32_t maximumWidth = 0;
+  std::uint32_t maximumHeight = 0;
   std::vector<FrameInterval> intervals;  // all intervals, or the shortest and the longest
   bool anyIntervalBetween = false;
 };
 
 struct VideoFormat {
   std::uint32_t index = 0;  // the driver's index, used as FormatIndex
-  std::string code;         // four characters, for example "YUYV"
-  std::string text;         // the driver's name for the format
+  std::string fourcc;       // four characters, for example "YUYV"
+  std::string description;  // the driver's name for the format
   std::vector<FrameSize> sizes;
 };
 
@@ -45,9 +45,9 @@ struct VideoControl {
   std::uint32_t id = 0;
   std::uint32_t type = 0;  // V4L2_CTRL_TYPE_...
   std::string name;
-  std::int64_t lowest = 0;
-  std::int64_t highest = 0;
-  std::int64_t usual = 0;  // the driver's default
+  std::int64_t minimum = 0;
+  std::int64_t maximum = 0;
+  std::int64_t defaultValue = 0;
 };
 
 enum class VideoNodeKind {

@@ -78,18 +78,18 @@ TEST(VideoNodesTest, DetailsAreFormatsWithSizesAndIntervalsAndControls) {
   ASSERT_EQ(details->formats.size(), 2U);
   const VideoFormat& grey = details->formats[1];
   EXPECT_EQ(grey.index, 1U);
-  EXPECT_EQ(grey.code, "GREY");
-  EXPECT_EQ(grey.text, "8-bit grey");
+  EXPECT_EQ(grey.fourcc, "GREY");
+  EXPECT_EQ(grey.description, "8-bit grey");
   ASSERT_EQ(grey.sizes.size(), 2U);
   EXPECT_EQ(grey.sizes[1].width, 640U);
-  EXPECT_EQ(grey.sizes[1].highestHeight, 480U);
+  EXPECT_EQ(grey.sizes[1].maximumHeight, 480U);
   EXPECT_EQ(grey.sizes[1].intervals, (std::vector<FrameInterval>{{1, 5}, {1, 25}}));
   EXPECT_FALSE(grey.sizes[1].anyIntervalBetween);
   ASSERT_EQ(details->controls.size(), 1U);
   EXPECT_EQ(details->controls[0].name, "Brightness");
-  EXPECT_EQ(details->controls[0].lowest, -64);
-  EXPECT_EQ(details->controls[0].highest, 64);
-  EXPECT_EQ(details->controls[0].usual, 12);
+  EXPECT_EQ(details->controls[0].minimum, -64);
+  EXPECT_EQ(details->controls[0].maximum, 64);
+  EXPECT_EQ(details->controls[0].defaultValue, 12);
 }
 
 // A driver that reports ranges.
@@ -120,9 +120,9 @@ TEST(VideoNodesTest, RangesOfSizesAndIntervalsAreToldByTheirEnds) {
   ASSERT_EQ(details->formats[0].sizes.size(), 1U);
   const FrameSize& size = details->formats[0].sizes[0];
   EXPECT_EQ(size.width, 16U);
-  EXPECT_EQ(size.highestWidth, 1920U);
+  EXPECT_EQ(size.maximumWidth, 1920U);
   EXPECT_EQ(size.height, 8U);
-  EXPECT_EQ(size.highestHeight, 1080U);
+  EXPECT_EQ(size.maximumHeight, 1080U);
   EXPECT_EQ(size.intervals, (std::vector<FrameInterval>{{1, 60}, {1, 1}}));
   EXPECT_TRUE(size.anyIntervalBetween);
 }
