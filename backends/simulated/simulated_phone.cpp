@@ -21,7 +21,7 @@
 namespace quazor {
 namespace {
 
-// As the scenario's faults select them; the device has its streams and groups in the scenario's order.
+// The names by which faults select objects. The device has its streams and groups in the scenario's order.
 ObjectNames namesOf(const Scenario& scenario) {
   ObjectNames names;
   for (const Camera& camera : scenario.cameras) names.streams.push_back(camera.id);
@@ -75,7 +75,7 @@ void SimulatedPhone::build(const Scenario& scenario, const std::shared_ptr<Clock
   inner.runLoops = std::move(runLoops);
   inner.concurrency = std::move(concurrency);
   platform_ = interceptedPlatform(inner, calls_, namesOf(scenario));
-  platform_.capture = makeSimulatedCapture(scenario, hardware_, calls_);  // makes its own calls pass `calls_`
+  platform_.capture = makeSimulatedCapture(scenario, hardware_, calls_);  // passes its own calls through `calls_`
 }
 
 std::vector<FaultStatus> SimulatedPhone::faultStatus() const { return calls_->faultStatus(); }

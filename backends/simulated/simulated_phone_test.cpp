@@ -26,7 +26,7 @@ Fault fault(std::string operation, FaultAction action, std::optional<std::string
   return fault;
 }
 
-// A clock that a test moves; it gives up a sleep that would never end.
+// A clock that a test advances; it fails a sleep that would never end.
 class SteppedClock final : public Clock {
  public:
   struct NeverEnds {};

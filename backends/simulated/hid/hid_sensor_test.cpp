@@ -176,7 +176,7 @@ TEST_F(HidSensorTest, AStopAndAStartBeginAFreshPeriod) {
   ASSERT_TRUE(user_->set(0xAB, 0) && user_->set(0xAB, 1));
   user_->run(11ms);
   EXPECT_THAT(user_->times(), ElementsAre(10ms, 25ms));
-  ASSERT_TRUE(user_->set(0xAB, 1));  // nothing changes
+  ASSERT_TRUE(user_->set(0xAB, 1));  // same value as before
   user_->run(9ms);
   EXPECT_THAT(user_->times(), ElementsAre(10ms, 25ms, 35ms));
 }

@@ -13,7 +13,7 @@ namespace {
 
 using namespace std::chrono_literals;
 
-// Chooses the last of what there is.
+// Always chooses the last alternative.
 class LastChooser final : public ScheduleStrategy {
  public:
   std::size_t choose(std::size_t count) override { return count - 1; }
