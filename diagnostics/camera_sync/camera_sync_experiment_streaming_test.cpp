@@ -1,4 +1,4 @@
-// Whole runs on a simulated phone that fail, or stumble, once the cameras have been synchronised.
+// Complete runs on a simulated phone with failures after the cameras have been synchronised.
 #include "diagnostics/camera_sync/camera_sync_experiment.h"
 
 #include "tests/sweeps/camera_sync_bench.h"
@@ -11,7 +11,7 @@ namespace {
 constexpr const char* kStart = "CaptureStream.start";
 constexpr const char* kStop = "CaptureStream.stop";
 
-// A refused format index: code 209; a refused frame rate: no error at all.
+// A rejected format index gives code 209; a rejected frame rate gives no error.
 class FailingConfiguration : public testing::TestWithParam<FaultRow> {};
 
 TEST_P(FailingConfiguration, IsToldExactly) {
@@ -89,7 +89,7 @@ TEST_P(FailingStream, IsToldExactly) {
   expectToldWithFault(GetParam(), Side::kBack, cameraSyncScenario(), kHealthyBackRun);
 }
 
-// All streams are stopped, those that never started too; the phone refuses to stop these.
+// The experiment stops all streams, even those that never started; the phone rejects those calls.
 const FaultRow kStreamingRows[] = {
     {"TheFirstStart", {kStart, "back-wide"}, R"(back-wide start -> failed
 log error: Failed to start steam at BackFacingCamera port! {error}
@@ -158,7 +158,7 @@ device relinquish control (back-wide, back-tele, back-super-wide)
 returned nothing
 error QZCapturePlugInErrorDomain code 210: No error counters for port BackFacingSuperWideCamera!{cause}
 )"},
-    // A stream that did not stop cannot be given back; there is a result all the same.
+    // Control of a stream that did not stop cannot be released, but there is a result.
     {"TheFirstStop",
      {kStop, "back-super-wide"},
      R"(back-super-wide stop -> failed
@@ -199,7 +199,7 @@ INSTANTIATE_TEST_SUITE_P(CameraSyncExperiment, FailingStream, testing::ValuesIn(
 TEST(CameraSyncExperiment, FailsAtTheFirstCameraThatTheStatusLeavesOut) {
   const struct {
     const char* camera;
-    const char* line;  // of the healthy run, where it goes wrong
+    const char* line;  // the line of the healthy run at which the failure occurs
     std::string told;
   } rows[] = {
       {"back-wide", "back-wide get ErrorCounters", "log error: No status available for port BackFacingCamera\n"},
@@ -277,7 +277,7 @@ ErrorCounters = {Front = {I2CErrorCount = 44}; FrontInfrared = {I2CErrorCount = 
              Side::kFront, scenario);
 }
 
-// What the phone itself refuses is told as what a fault refuses.
+// A rejection by the phone is reported like an injected fault.
 TEST(CameraSyncExperiment, TellsThePhonesOwnRefusals) {
   Scenario scenario = cameraSyncScenario();
   cameraOf(scenario, "back-tele").formats.resize(14);
