@@ -205,7 +205,7 @@ void FakeV4l2Api::close(int descriptor) {
   FakeNode& node = nodes_.at(descriptors_.at(descriptor));
   descriptors_.erase(descriptor);
   if (node.lockedBy == descriptor) node.lockedBy = -1;
-  if (node.owner == descriptor) {  // as the kernel does it; what is mapped stays in use
+  if (node.owner == descriptor) {  // like the kernel; mapped buffers remain in use
     node.owner = -1;
     node.streaming = false;
     if (node.mapped == 0) node.buffers = 0;
@@ -236,7 +236,7 @@ int FakeV4l2Api::ioctl(int descriptor, unsigned long request, void* argument) {
   return -result;
 }
 
-// Returns 0 or the error number.
+// Returns 0 or an error number.
 int FakeV4l2Api::call(FakeNode& node, int descriptor, unsigned long request, void* argument) {
   switch (request) {
     case VIDIOC_QUERYCAP: {

@@ -1,4 +1,4 @@
-// What a healthy run does, call by call and word by word.
+// The complete traces of healthy runs.
 #include "tests/sweeps/camera_sync_bench.h"
 
 namespace quazor {
@@ -152,7 +152,7 @@ BackSuperWide.Frames = 58 frames
 ErrorCounters = {BackWide = {I2CErrorCount = 11}; BackTele = {I2CErrorCount = 22}; BackSuperWide = {I2CErrorCount = 33}}
 )";
 
-// The group of the back cameras is looked through first: it has streams enough, and none of the ports.
+// The group of the back cameras is checked first: it has enough streams, but none for the ports.
 const char* const kHealthyFrontRun =
     R"(service create plug-in
 plug-in get device

@@ -1,5 +1,5 @@
-// Makes every call of a camera synchronisation fail, and every two calls, and compares each run to the last word with
-// what the oracle says it must be.
+// Makes every call and every pair of calls of a camera synchronisation fail, and compares the complete trace of each
+// run with the oracle's prediction.
 #include "backends/simulated/scenario/scenario.h"
 #include "backends/simulated/simulated_phone.h"
 #include "contract/message_format.h"
@@ -20,7 +20,7 @@
 namespace quazor {
 namespace {
 
-// One run, as the diagnostic of that name is registered to make it, on one phone.
+// A run on one phone, of the experiment as registered for the diagnostic of that name.
 struct Sweep {
   const char* name;
   bool masterConfiguration;
@@ -60,7 +60,7 @@ oracle::Phone phoneOf(const Scenario& scenario) {
   return phone;
 }
 
-// A call that is made to fail: the nth of the run.
+// A failing call: the nth of the run.
 struct Failure {
   std::size_t call;
   bool hasError;
@@ -89,7 +89,7 @@ oracle::Failures failuresOf(const std::vector<Failure>& failures) {
 struct Outcome {
   std::string told;
   std::size_t calls = 0;
-  std::vector<std::uint64_t> fired;  // how often each of the failures happened
+  std::vector<std::uint64_t> fired;  // how often each of the failures occurred
 };
 
 class CameraSyncSweep : public testing::TestWithParam<Sweep> {
@@ -119,7 +119,7 @@ class CameraSyncSweep : public testing::TestWithParam<Sweep> {
     return outcome;
   }
 
-  // Runs with the failures and compares with the oracle; returns what happened.
+  // Runs with the failures, compares with the oracle and returns the outcome.
   Outcome check(const std::vector<Failure>& failures, ErrorPlace place) {
     ++cases_;
     Outcome outcome = run(failures, place);
@@ -130,8 +130,8 @@ class CameraSyncSweep : public testing::TestWithParam<Sweep> {
     return outcome;
   }
 
-  // Lets each call behind the first failure fail too, in the run that the first failure leads to, and one call more,
-  // which is never reached.
+  // Also makes each call after the first failure fail, in the run that results from the first failure, and the call
+  // after the last, which is never reached.
   void checkWithEveryLaterFailure(const Failure& first, bool hasError, ErrorPlace place) {
     const Outcome alone = run({first}, place);
     for (std::size_t second = first.call + 1; second <= alone.calls + 1; ++second) {
@@ -172,14 +172,14 @@ TEST_P(CameraSyncSweep, EveryCallMayFail) {
       }
     }
   }
-  // One more than there are does nothing.
+  // A failure after the last call has no effect.
   const Outcome beyond = check({{calls + 1, true}}, ErrorPlace::kGiven);
   EXPECT_EQ(beyond.fired, std::vector<std::uint64_t>{0});
   EXPECT_EQ(beyond.told, run({}, ErrorPlace::kGiven).told);
 }
 
-// Of all ways in which two calls can fail, those in which an error could be mistaken for another's, or be there where
-// none may be.
+// Covers the pairs of failing calls in which an error could be confused with another one, or stored where none is
+// allowed.
 TEST_P(CameraSyncSweep, EveryTwoCallsMayFail) {
   const std::size_t healthyCalls = run({}, ErrorPlace::kGiven).calls;
   ASSERT_GT(healthyCalls, 20U);

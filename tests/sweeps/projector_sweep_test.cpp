@@ -1,5 +1,5 @@
-// Makes every call of a projector fault run and its teardown fail, and every two calls, and compares each run to the
-// last word with what the oracle says it must be.
+// Makes every call and every pair of calls of a projector fault run and its teardown fail, and compares the complete
+// trace of each run with the oracle's prediction.
 #include "backends/simulated/scenario/scenario.h"
 #include "tests/support/run_transcript.h"
 #include "tests/support/shipped_scenario.h"
@@ -22,13 +22,13 @@ namespace {
 using projector_oracle::FrameFault;
 using projector_oracle::PhoneFrame;
 
-// One run on one phone.
+// A run on one phone.
 struct Sweep {
   const char* name;
   projector_oracle::Request request = {};
   std::optional<FrameFault> secondFrame = {};
   bool sendsFrames = true;
-  bool isShipped = false;  // the healthy phone that comes with the program, not the bench's
+  bool isShipped = false;  // the shipped healthy phone instead of the bench's
 };
 void PrintTo(const Sweep& sweep, std::ostream* out) { *out << sweep.name; }
 
@@ -94,7 +94,7 @@ projector_oracle::Phone phoneOf(const Sweep& sweep, Scenario scenario) {
   return phone;
 }
 
-// A call that is made to fail: the nth of the run.
+// A failing call: the nth of the run.
 struct Failure {
   std::size_t call;
   bool hasError;
@@ -128,7 +128,7 @@ class ProjectorSweep : public testing::TestWithParam<Sweep> {
   }
   void TearDown() override { std::cout << "[sweep] " << GetParam().name << ": " << cases_ << " cases\n"; }
 
-  // Runs with the failures, under a seed of its own, and compares with the oracle.
+  // Runs with the failures and a distinct seed, and compares with the oracle.
   ProjectorRun check(const std::vector<Failure>& failures, ErrorPlace place) {
     const projector_oracle::Request& request = GetParam().request;
     ProjectorRequest made;
@@ -146,8 +146,8 @@ class ProjectorSweep : public testing::TestWithParam<Sweep> {
     return run;
   }
 
-  // Lets each call behind the first failure fail too, in the run that the first failure leads to, and one call more,
-  // which is never reached.
+  // Also makes each call after the first failure fail, in the run that results from the first failure, and the call
+  // after the last, which is never reached.
   void checkWithEveryLaterFailure(const Failure& first, bool hasError, ErrorPlace place) {
     const ProjectorRun alone = check({first}, place);
     for (std::size_t second = first.call + 1; second <= alone.calls + 1; ++second) {
@@ -189,13 +189,13 @@ TEST_P(ProjectorSweep, EveryCallMayFail) {
       }
     }
   }
-  // One more than there are does nothing.
+  // A failure after the last call has no effect.
   const ProjectorRun beyond = check({{healthy.calls + 1, true}}, ErrorPlace::kGiven);
   EXPECT_EQ(beyond.fired, std::vector<std::uint64_t>{0});
   EXPECT_EQ(beyond.told, healthy.told);
 }
 
-// Without a place for an error both failures have errors, so that there is something that must not be stored.
+// Without an error variable both failures have errors, none of which may be stored.
 TEST_P(ProjectorSweep, EveryTwoCallsMayFail) {
   const std::size_t calls = check({}, ErrorPlace::kGiven).calls;
   ASSERT_GT(calls, 20U);

@@ -1,5 +1,5 @@
 #!/usr/bin/env python3
-"""Feeds tests/tree/folders.py small made-up trees, one per rule, and checks that the tree's own folders are named rightly."""
+"""Tests tests/tree/folders.py with small trees, one per rule, and checks that the folders it names exist."""
 
 import pathlib
 import tempfile
@@ -20,7 +20,7 @@ TREE = {"contract/value.h": "", "contract/CMakeLists.txt": "", "contract/README.
 
 
 def found_in(changes, described=()):
-    """The violations in a tree that is well but for `changes`: texts by path, None for a file that is not there."""
+    """The violations in a valid tree with `changes`: texts by path, None for a missing file."""
     with tempfile.TemporaryDirectory() as directory:
         root = pathlib.Path(directory)
         for name, text in {**TREE, **changes}.items():

@@ -1,5 +1,5 @@
 #!/usr/bin/env python3
-"""Feeds tests/tree/include_directions.py small made-up trees, one per rule."""
+"""Tests tests/tree/include_directions.py with small trees, one per rule."""
 
 import pathlib
 import subprocess
@@ -19,7 +19,7 @@ TREE = [
 
 
 def found_in(path, line, extra=()):
-    """The violations in a tree whose one interesting file, `path`, holds `line`."""
+    """The violations in a tree whose only relevant file, `path`, contains `line`."""
     with tempfile.TemporaryDirectory() as directory:
         root = pathlib.Path(directory)
         for name in [*TREE, *extra]:
