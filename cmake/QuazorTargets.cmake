@@ -65,8 +65,8 @@ function(quazor_library name)
   else()
     quazor_precompile(quazor_${name} plain ${QUAZOR_COMMON_HEADERS})
   endif()
-  # The host and the file readers and writers wait for hardware and disks: -O2 would take a third of the build time
-  # without a noticeable effect.
+  # The host and what reads or writes files wait for hardware and disks: what -O2 adds there is a third of the build's
+  # time, and nobody feels it.
   if(name MATCHES "^host_" OR "nlohmann_json::nlohmann_json" IN_LIST ARG_DEPENDS)
     target_compile_options(quazor_${name} PRIVATE $<$<CONFIG:Release>:-O1>)
   endif()

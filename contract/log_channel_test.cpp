@@ -36,7 +36,7 @@ namespace {
 using testing::ElementsAre;
 using testing::IsEmpty;
 
-// Stores the lines as "LEVEL SUBSYSTEM CATEGORY TEXT".
+// Keeps the lines it is given, as "level subsystem category text".
 class KeepingBackend final : public LogBackend {
  public:
   void write(LogLevel level, std::string_view subsystem, std::string_view category, std::string_view text) override {

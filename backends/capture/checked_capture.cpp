@@ -85,11 +85,11 @@ class ClientDevice final : public CaptureDevice {
   bool checkGroup(const CaptureGroupSlot& group, const Refuser& refuse) const;
 
   const std::shared_ptr<CaptureClient> client_;
-  ClientStreams streams_;                             // by the camera's index
-  std::vector<std::shared_ptr<ClientGroup>> groups_;  // by the group's index
+  ClientStreams streams_;                             // by index of the camera
+  std::vector<std::shared_ptr<ClientGroup>> groups_;  // by index of the group
 };
 
-// Null, and the refusal told, when it is no stream of this device.
+// Returns null and stores the refusal if it is not a stream of this device.
 CameraSlot* ClientDevice::cameraOf(const std::shared_ptr<CaptureStream>& stream, const Refuser& refuse) const {
   const auto own = std::dynamic_pointer_cast<ClientStream>(stream);
   if (own != nullptr && std::ranges::find(streams_, own) != streams_.end()) {
@@ -110,7 +110,7 @@ bool ClientDevice::acquireAll(const CaptureStreams& streams, const Refuser& refu
   if (!wanted.empty()) slots.back->prepareToOpen();
   std::vector<CameraSlot*> opened;
   for (CameraSlot* camera : wanted) {
-    if (camera->holder == client_->id()) continue;  // it is in the list twice
+    if (camera->holder == client_->id()) continue;  // the list contains it twice
     CameraSettings settings;
     if (!camera->back->open(settings, refuse.error())) {
       for (CameraSlot* one : opened) slots.release(*one);
@@ -160,7 +160,7 @@ bool ClientDevice::set(const Value& value, std::string_view key, const Refuser& 
   for (const std::size_t index : groups) {
     if (!checkGroup(slots.groups[index], refuse)) return false;
   }
-  for (const std::size_t index : groups) {  // a new session: what was streamed before is not part of it
+  for (const std::size_t index : groups) {  // a new session, which does not include earlier runs
     for (const std::size_t camera : slots.groups[index].info.cameras) slots.cameras[camera].run.reset();
   }
   slots.configuredGroups = std::move(groups);

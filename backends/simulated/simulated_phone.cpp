@@ -75,7 +75,7 @@ void SimulatedPhone::build(const Scenario& scenario, const std::shared_ptr<Clock
   inner.runLoops = std::move(runLoops);
   inner.concurrency = std::move(concurrency);
   platform_ = interceptedPlatform(inner, calls_, namesOf(scenario));
-  platform_.capture = makeSimulatedCapture(scenario, hardware_, calls_);  // passes its own calls through `calls_`
+  platform_.capture = makeSimulatedCapture(scenario, hardware_, calls_);  // makes its own calls pass `calls_`
 }
 
 std::vector<FaultStatus> SimulatedPhone::faultStatus() const { return calls_->faultStatus(); }

@@ -179,7 +179,7 @@ TYPED_TEST_P(RunLoopConformance, SourcesAreHandledInTheOrderOfTheirAddition) {
   for (const auto& source : {third, first, second}) source->signal();
   this->runOnce();
   EXPECT_EQ(this->takeWords(), (typename TestFixture::Words{"first", "second", "third"}));
-  this->loop_.addSource(first, TestFixture::kDefault);  // already added: no effect
+  this->loop_.addSource(first, TestFixture::kDefault);  // is there: no effect
   this->loop_.removeSource(second, TestFixture::kDefault);
   this->loop_.addSource(second, TestFixture::kDefault);
   for (const auto& source : {third, first, second}) source->signal();
@@ -224,7 +224,7 @@ TYPED_TEST_P(RunLoopConformance, TheCommonModesAreTheDefaultModeAndNoRunIsInThem
   EXPECT_EQ(this->run(TestFixture::kLong, true, kRunLoopCommonModes), RunLoopResult::kFinished);
   EXPECT_EQ(this->run(TestFixture::kLong, true), RunLoopResult::kHandledSource);
   EXPECT_EQ(this->takeWords(), (typename TestFixture::Words{"handled"}));
-  this->loop_.addSource(source, TestFixture::kDefault);  // already added
+  this->loop_.addSource(source, TestFixture::kDefault);  // is there
   this->loop_.removeSource(source, kRunLoopCommonModes);
   EXPECT_EQ(this->run(), RunLoopResult::kFinished);
 }

@@ -125,7 +125,7 @@ TYPED_TEST_P(RunLoopObserverConformance, ObserversTakePartOnlyInRunsInTheirModes
 
 TYPED_TEST_P(RunLoopObserverConformance, AnObserverOfTheCommonModesIsToldInTheDefaultMode) {
   const auto observer = this->addWitness(kRunLoopExit, "", true, 0, kRunLoopCommonModes);
-  this->loop_.addObserver(observer, TestFixture::kDefault);  // already added
+  this->loop_.addObserver(observer, TestFixture::kDefault);  // is there
   this->runOnce();
   EXPECT_EQ(this->takeWords(), (typename TestFixture::Words{"exit"}));
   this->runOnce(kRunLoopCommonModes);

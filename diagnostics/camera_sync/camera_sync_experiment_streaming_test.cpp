@@ -89,7 +89,7 @@ TEST_P(FailingStream, IsToldExactly) {
   expectToldWithFault(GetParam(), Side::kBack, cameraSyncScenario(), kHealthyBackRun);
 }
 
-// The experiment stops all streams, even those that never started; the phone rejects those calls.
+// All streams are stopped, those that never started too; the phone refuses to stop these.
 const FaultRow kStreamingRows[] = {
     {"TheFirstStart", {kStart, "back-wide"}, R"(back-wide start -> failed
 log error: Failed to start steam at BackFacingCamera port! {error}
@@ -158,7 +158,7 @@ device relinquish control (back-wide, back-tele, back-super-wide)
 returned nothing
 error QZCapturePlugInErrorDomain code 210: No error counters for port BackFacingSuperWideCamera!{cause}
 )"},
-    // Control of a stream that did not stop cannot be released, but there is a result.
+    // A stream that did not stop cannot be given back; there is a result all the same.
     {"TheFirstStop",
      {kStop, "back-super-wide"},
      R"(back-super-wide stop -> failed
@@ -199,7 +199,7 @@ INSTANTIATE_TEST_SUITE_P(CameraSyncExperiment, FailingStream, testing::ValuesIn(
 TEST(CameraSyncExperiment, FailsAtTheFirstCameraThatTheStatusLeavesOut) {
   const struct {
     const char* camera;
-    const char* line;  // the line of the healthy run at which the failure occurs
+    const char* line;  // of the healthy run, where it goes wrong
     std::string told;
   } rows[] = {
       {"back-wide", "back-wide get ErrorCounters", "log error: No status available for port BackFacingCamera\n"},

@@ -157,7 +157,7 @@ void replaceAll(std::string& text, std::string_view from, std::string_view to) {
   }
 }
 
-// The trace for a caller without an error variable.
+// What is told to a caller without a place for errors.
 std::string toldWithoutPlace(std::string told) {
   for (std::size_t at = told.find("\nerror "); at != std::string::npos; at = told.find("\nerror ", at + 1)) {
     told.replace(at + 1, told.find('\n', at + 1) - at - 1, "no place for an error");
@@ -165,7 +165,7 @@ std::string toldWithoutPlace(std::string told) {
   return told;
 }
 
-// The trace of the healthy run up to the nth occurrence of the line.
+// The healthy run before the line stands for the nth time.
 std::string healthyUpTo(std::string_view line, std::uint64_t occurrence = 1) {
   const std::string wanted = '\n' + std::string(line) + '\n';
   const std::string run = '\n' + kHealthyRun;

@@ -18,10 +18,10 @@ namespace {
 
 using std::chrono::milliseconds;
 
-// A placeholder in traces for the error of a rejected call, if it stored one.
+// Stands in a trace for what a refused call gave as its own error, where it gave one.
 constexpr std::string_view kCause = "[, caused by BenchErrorDomain code 7: Broken.]";
 
-// The text of the image from imageReport(frameID) in the result.
+// How the image of imageReport(frameID) reads in the result.
 std::string imageText(std::uint32_t frameID) {
   Array inPhase;
   Array quadrature;
@@ -46,8 +46,8 @@ class NimbeImageRun : public testing::Test {
  protected:
   using Change = std::function<void(HandMadeSensor& sensor)>;
 
-  // Checks that the calls and the result of a run equal `trace`, in which "@1" stands for the first image and so on.
-  // Tries all combinations: with and without an error of the device, with and without an error variable.
+  // Everything that a run does and returns is `trace`, in which "@1" stands for the first image and so on; with an
+  // error of the device's own and without, with a place for an error and without.
   static void expectRun(const std::string& trace, const Change& change, bool hasStream = true) {
     for (const bool hasOwnError : {true, false}) {
       for (const ErrorPlace place : {ErrorPlace::kGiven, ErrorPlace::kNone}) {
@@ -245,7 +245,7 @@ error HidErrorDomain code -536: The device is gone.
             });
 }
 
-// The timeout is checked first.
+// The time is looked at first.
 TEST_F(NimbeImageRun, FailsForTheTimeWhenTheDeviceFailsAtItsEnd) {
   expectRun(kOpened + kClosed + "loop stop\n" + kClosed + R"(loop run timed out
 loop removeObserver common

@@ -196,7 +196,7 @@ std::optional<std::uint64_t> memoryOf(const std::string& text) {
   if (text == "none") return std::nullopt;
   if (!text.empty()) return parseWhole("--memory", text, 1, UINT64_MAX / kMebibyte) * kMebibyte;
 #if defined(__SANITIZE_ADDRESS__) || defined(__SANITIZE_THREAD__)
-  return std::nullopt;  // sanitizers reserve more address space than any limit allows
+  return std::nullopt;  // sanitizers reserve a larger address space than any limit
 #else
   return kDefaultMebibytes * kMebibyte;
 #endif

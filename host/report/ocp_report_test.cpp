@@ -33,7 +33,7 @@ RunStarted startedRun() {
   return run;
 }
 
-// A record in which all stages took place.
+// A record whose stages all took place.
 DiagnosticRecord fullRecord(Verdict verdict) {
   DiagnosticRecord record = recordOf("Diagnostic", verdict);
   record.experimentName = "E";

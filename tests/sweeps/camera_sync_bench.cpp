@@ -44,7 +44,7 @@ void replaceAll(std::string& text, std::string_view from, std::string_view to) {
   }
 }
 
-// The trace for a caller without an error variable.
+// As `told` reads for a caller without a place for an error.
 std::string toldWithoutPlace(std::string told) {
   const std::size_t at = told.find("\nerror ", told.find("returned "));
   EXPECT_NE(at, std::string::npos) << told;

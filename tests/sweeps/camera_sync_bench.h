@@ -33,7 +33,7 @@ struct BenchRun {
 };
 BenchRun runOnBench(Side side, const Scenario& scenario, const std::optional<Fault>& fault, ErrorPlace place);
 
-// The complete traces of healthy runs from runOnBench().
+// What runOnBench() tells of healthy runs, in full.
 extern const char* const kHealthyBackRun;
 extern const char* const kHealthyFrontRun;
 // The back run on the phone without the master configuration.

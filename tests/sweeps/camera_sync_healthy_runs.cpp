@@ -152,7 +152,7 @@ BackSuperWide.Frames = 58 frames
 ErrorCounters = {BackWide = {I2CErrorCount = 11}; BackTele = {I2CErrorCount = 22}; BackSuperWide = {I2CErrorCount = 33}}
 )";
 
-// The group of the back cameras is checked first: it has enough streams, but none for the ports.
+// The group of the back cameras is looked through first: it has streams enough, and none of the ports.
 const char* const kHealthyFrontRun =
     R"(service create plug-in
 plug-in get device

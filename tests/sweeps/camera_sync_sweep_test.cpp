@@ -60,7 +60,7 @@ oracle::Phone phoneOf(const Scenario& scenario) {
   return phone;
 }
 
-// A failing call: the nth of the run.
+// A call that is made to fail: the nth of the run.
 struct Failure {
   std::size_t call;
   bool hasError;
@@ -89,7 +89,7 @@ oracle::Failures failuresOf(const std::vector<Failure>& failures) {
 struct Outcome {
   std::string told;
   std::size_t calls = 0;
-  std::vector<std::uint64_t> fired;  // how often each of the failures occurred
+  std::vector<std::uint64_t> fired;  // how often each of the failures happened
 };
 
 class CameraSyncSweep : public testing::TestWithParam<Sweep> {
@@ -119,7 +119,7 @@ class CameraSyncSweep : public testing::TestWithParam<Sweep> {
     return outcome;
   }
 
-  // Runs with the failures, compares with the oracle and returns the outcome.
+  // Runs with the failures and compares with the oracle; returns what happened.
   Outcome check(const std::vector<Failure>& failures, ErrorPlace place) {
     ++cases_;
     Outcome outcome = run(failures, place);
@@ -130,8 +130,8 @@ class CameraSyncSweep : public testing::TestWithParam<Sweep> {
     return outcome;
   }
 
-  // Also makes each call after the first failure fail, in the run that results from the first failure, and the call
-  // after the last, which is never reached.
+  // Lets each call behind the first failure fail too, in the run that the first failure leads to, and one call more,
+  // which is never reached.
   void checkWithEveryLaterFailure(const Failure& first, bool hasError, ErrorPlace place) {
     const Outcome alone = run({first}, place);
     for (std::size_t second = first.call + 1; second <= alone.calls + 1; ++second) {
@@ -172,7 +172,7 @@ TEST_P(CameraSyncSweep, EveryCallMayFail) {
       }
     }
   }
-  // A failure after the last call has no effect.
+  // One more than there are does nothing.
   const Outcome beyond = check({{calls + 1, true}}, ErrorPlace::kGiven);
   EXPECT_EQ(beyond.fired, std::vector<std::uint64_t>{0});
   EXPECT_EQ(beyond.told, run({}, ErrorPlace::kGiven).told);

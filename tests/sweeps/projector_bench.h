@@ -35,14 +35,14 @@ struct ProjectorRequest {
 };
 
 struct ProjectorRun {
-  // The run in the format of runAndTell(), then "afterwards" and the events on the phone until `watched`, then
+  // The run as runAndTell() tells it; then "afterwards" and what happens on the phone until `watched`; then
   //   torn down | not torn down
   //   error untouched | error emptied | error (as errorChain()) | no place for an error
   //   buffers held: front-infrared 3, 4 | buffers held: none
-  // Frames are numbered from 1 here too.
+  // Frames count from 1 here too.
   std::string told;
-  std::size_t calls = 0;             // that can fail, including those of the teardown
-  std::vector<std::uint64_t> fired;  // how often each of the faults fired
+  std::size_t calls = 0;             // that can fail, the teardown's included
+  std::vector<std::uint64_t> fired;  // how often each of the faults happened
 };
 
 // Sets up a new experiment, runs it on a new phone in virtual time, lets time pass, and tears it down. The run and the

@@ -94,7 +94,7 @@ projector_oracle::Phone phoneOf(const Sweep& sweep, Scenario scenario) {
   return phone;
 }
 
-// A failing call: the nth of the run.
+// A call that is made to fail: the nth of the run.
 struct Failure {
   std::size_t call;
   bool hasError;
@@ -128,7 +128,7 @@ class ProjectorSweep : public testing::TestWithParam<Sweep> {
   }
   void TearDown() override { std::cout << "[sweep] " << GetParam().name << ": " << cases_ << " cases\n"; }
 
-  // Runs with the failures and a distinct seed, and compares with the oracle.
+  // Runs with the failures, under a seed of its own, and compares with the oracle.
   ProjectorRun check(const std::vector<Failure>& failures, ErrorPlace place) {
     const projector_oracle::Request& request = GetParam().request;
     ProjectorRequest made;
@@ -146,8 +146,8 @@ class ProjectorSweep : public testing::TestWithParam<Sweep> {
     return run;
   }
 
-  // Also makes each call after the first failure fail, in the run that results from the first failure, and the call
-  // after the last, which is never reached.
+  // Lets each call behind the first failure fail too, in the run that the first failure leads to, and one call more,
+  // which is never reached.
   void checkWithEveryLaterFailure(const Failure& first, bool hasError, ErrorPlace place) {
     const ProjectorRun alone = check({first}, place);
     for (std::size_t second = first.call + 1; second <= alone.calls + 1; ++second) {
@@ -189,7 +189,7 @@ TEST_P(ProjectorSweep, EveryCallMayFail) {
       }
     }
   }
-  // A failure after the last call has no effect.
+  // One more than there are does nothing.
   const ProjectorRun beyond = check({{healthy.calls + 1, true}}, ErrorPlace::kGiven);
   EXPECT_EQ(beyond.fired, std::vector<std::uint64_t>{0});
   EXPECT_EQ(beyond.told, healthy.told);

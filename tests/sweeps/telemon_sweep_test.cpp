@@ -19,7 +19,7 @@
 namespace quazor {
 namespace {
 
-// The number of the failing call, starting at 1, or 0 for none, and whether it stores an error.
+// Which call fails, from 1, or 0 for none; with an error of its own or without one.
 struct Failure {
   std::size_t call = 0;
   bool hasError = true;

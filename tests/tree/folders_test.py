@@ -20,7 +20,7 @@ TREE = {"contract/value.h": "", "contract/CMakeLists.txt": "", "contract/README.
 
 
 def found_in(changes, described=()):
-    """The violations in a valid tree with `changes`: texts by path, None for a missing file."""
+    """The violations in a tree that is well but for `changes`: texts by path, None for a file that is not there."""
     with tempfile.TemporaryDirectory() as directory:
         root = pathlib.Path(directory)
         for name, text in {**TREE, **changes}.items():

@@ -19,7 +19,7 @@ TREE = [
 
 
 def found_in(path, line, extra=()):
-    """The violations in a tree whose only relevant file, `path`, contains `line`."""
+    """The violations in a tree whose one interesting file, `path`, holds `line`."""
     with tempfile.TemporaryDirectory() as directory:
         root = pathlib.Path(directory)
         for name in [*TREE, *extra]:

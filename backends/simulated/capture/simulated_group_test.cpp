@@ -15,7 +15,7 @@ Dictionary masterConfiguration(std::string_view port, Value slave) {
   return {{"SlaveConfigurationByPortType", Dictionary{{std::string(port), std::move(slave)}}}};
 }
 
-// Not of the phone.
+// A stream of another device.
 class ForeignStream final : public CaptureStream {
  public:
   std::string description() const override { return "foreign stream"; }

@@ -1,4 +1,4 @@
-// A plug-in for tests of the host: its diagnostic receives frames from the phone's first camera.
+// A plug-in for tests of the host: its diagnostic takes frames from the phone's first camera.
 #include "contract/lab.h"
 #include "host/testing/plugins/fake_diagnostic.h"
 #include "platform/capture_keys.h"

@@ -1,4 +1,4 @@
-// A plug-in for tests of the host: diagnostics that violate the contract, each in a different way.
+// A plug-in for tests of the host: diagnostics that do not go by the rules, each in its own way.
 #include "contract/lab.h"
 #include "contract/log_channel.h"
 #include "host/testing/plugins/fake_diagnostic.h"
