@@ -31,9 +31,9 @@ ExitCode list(const Options& options, const Installation& installation, Console&
     std::erase_if(all, [](const Diagnostic& one) { return !one.experimentOnly || !one.usedBy.empty(); });
     return all;
   };
-  const PluginScan survey = surveyOf(options, installation, aloneAndUnused);
+  const PluginScan scan = scanOf(options, installation, aloneAndUnused);
   std::vector<DescribedDiagnostic> listed;
-  for (const DescribedDiagnostic& one : survey.catalogue) {
+  for (const DescribedDiagnostic& one : scan.catalogue) {
     if (one.diagnostic.usedBy.empty()) listed.push_back(one);
   }
   std::ostringstream text;
@@ -43,7 +43,7 @@ ExitCode list(const Options& options, const Installation& installation, Console&
     printList(text, listed);
   }
   writeOutput(options.report, console, text.str());
-  return reportFailed(survey.failed, console, ExitCode::kAllPassed);
+  return reportFailed(scan.failed, console, ExitCode::kAllPassed);
 }
 
 ExitCode describe(const Options& options, const Installation& installation, Console& console) {

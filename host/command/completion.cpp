@@ -112,7 +112,7 @@ class Completer {
     }
     try {
       std::vector<DescribedDiagnostic> all =
-          surveyOf(options, installation_, [described](const std::vector<Diagnostic>& everything) {
+          scanOf(options, installation_, [described](const std::vector<Diagnostic>& everything) {
             return described ? everything : std::vector<Diagnostic>();
           }).catalogue;
       std::vector<DescribedDiagnostic> named;

@@ -66,19 +66,19 @@ class Doctor {
   std::string findingOfPlugin(const std::filesystem::path& plugin) const {
     Options alone = options_;
     alone.plugins = {plugin};
-    const PluginScan survey = surveyOf(alone, installation_, [](const std::vector<Diagnostic>& all) { return all; });
-    if (!survey.failed.empty()) {
-      throw CommandError(ExitCode::kCannotRead, survey.failed.front().error->localizedDescription());
+    const PluginScan scan = scanOf(alone, installation_, [](const std::vector<Diagnostic>& all) { return all; });
+    if (!scan.failed.empty()) {
+      throw CommandError(ExitCode::kCannotRead, scan.failed.front().error->localizedDescription());
     }
     std::size_t diagnostics = 0;
-    for (const DescribedDiagnostic& one : survey.catalogue) {
+    for (const DescribedDiagnostic& one : scan.catalogue) {
       if (one.description.error != nullptr) {
         throw CommandError(ExitCode::kCannotRead, one.diagnostic.name + " cannot be described: " +
                                                       one.description.error->localizedDescription());
       }
       if (!one.diagnostic.experimentOnly) ++diagnostics;
     }
-    return countText(diagnostics, "diagnostic") + ", " + countText(survey.catalogue.size() - diagnostics, "experiment");
+    return countText(diagnostics, "diagnostic") + ", " + countText(scan.catalogue.size() - diagnostics, "experiment");
   }
 
   void checkPhones() {

@@ -211,10 +211,10 @@ ExitCode analyzeCommand(const Options& given, const Installation& installation, 
   Options options = given;
   if (options.profile.empty()) options.withoutProfile = true;  // the record contains the profile's values
   for (ParameterOverride& setting : options.settings) {
-    if (setting.half == Part::kExperiment) {
+    if (setting.part == Part::kExperiment) {
       throw CommandError(ExitCode::kUsage, "--set '" + setting.text + "': 'quazor analyze' does not run experiments");
     }
-    setting.half = Part::kAnalysis;
+    setting.part = Part::kAnalysis;
   }
   std::vector<const DiagnosticRecord*> analysable;
   for (const DiagnosticRecord& record : run.records) {

@@ -20,11 +20,11 @@ IsolationOptions isolationOf(const Options& options, const Installation& install
 // Scans the plug-ins in a separate process, or in this one with --in-process. `described` chooses the diagnostics that
 // are asked for their descriptions. Throws a CommandError if a plug-in cannot be loaded, and kInterrupted on an
 // interrupt.
-PluginScan surveyOf(const Options& options, const Installation& installation, const DiagnosticChoice& described);
+PluginScan scanOf(const Options& options, const Installation& installation, const DiagnosticChoice& described);
 
-// Scans the plug-ins and describes only what the options select. Throws like surveyOf, and for names of another kind
+// Scans the plug-ins and describes only what the options select. Throws like scanOf, and for names of another kind
 // than the command expects. Unknown names are ignored.
-PluginScan surveyForSelection(const Options& options, const Installation& installation);
+PluginScan scanForSelection(const Options& options, const Installation& installation);
 
 // The selected diagnostics or experiments with their parameters. All checks are done except for required parameters
 // without a value. Only the selected diagnostics are described, unless a profile's entry matches more than those and

@@ -165,7 +165,7 @@ TEST_F(SelectionTest, AsksOnlyWhatIsSelectedForItsDescription) {
     options_.names = row.names;
     std::vector<std::string> asked;
     const Installation installation(directory_.path() / "bin" / "quazor");
-    const std::vector<DescribedDiagnostic> all = surveyForSelection(options_, installation).catalogue;
+    const std::vector<DescribedDiagnostic> all = scanForSelection(options_, installation).catalogue;
     for (const DescribedDiagnostic& one : all) {
       if (one.description.isAsked) asked.push_back(one.diagnostic.name);
     }

@@ -22,14 +22,14 @@ namespace quazor {
 // The two parts of a diagnostic, each with its own parameters.
 enum class Part { kExperiment, kAnalysis };
 
-std::string_view nameOf(Part half);  // "experiment", "analysis"
+std::string_view nameOf(Part part);  // "experiment", "analysis"
 
 struct ProfileEntry {
   std::string name;
   OrderedMap<Value> experiment;
   OrderedMap<Value> analysis;
 
-  const OrderedMap<Value>& values(Part half) const { return half == Part::kExperiment ? experiment : analysis; }
+  const OrderedMap<Value>& values(Part part) const { return part == Part::kExperiment ? experiment : analysis; }
 };
 
 struct Profile {
@@ -41,7 +41,7 @@ struct Profile {
 
   // The value for a parameter, or null. The entry with the exact name of the diagnostic takes precedence over patterns,
   // and a later pattern over an earlier one. An entry without the parameter is skipped.
-  const Value* find(const std::string& diagnostic, Part half, std::string_view parameter) const;
+  const Value* find(const std::string& diagnostic, Part part, std::string_view parameter) const;
   // Like find(), for a parameter of an experiment that runs on its own. If no entry for experiments has the parameter,
   // the value is that of the first diagnostic in `usedBy` that has one.
   const Value* findForExperiment(const std::string& experiment, const std::vector<std::string>& usedBy,

@@ -16,12 +16,12 @@ std::string valueText(const Measurement& measurement) {
   return formatMessage("%@ %@", measurement.value(), measurement.unit().symbol());
 }
 
-void addParameters(JUnitProperties& properties, std::string_view half,
+void addParameters(JUnitProperties& properties, std::string_view part,
                    const std::vector<ResolvedParameter>& parameters) {
   for (const ResolvedParameter& one : parameters) {
     if (!one.value) continue;
-    properties.add(formatMessage("parameter.%@.%@", half, one.name), defaultText(*one.value));
-    properties.add(formatMessage("source.%@.%@", half, one.name), one.source);
+    properties.add(formatMessage("parameter.%@.%@", part, one.name), defaultText(*one.value));
+    properties.add(formatMessage("source.%@.%@", part, one.name), one.source);
   }
 }
 

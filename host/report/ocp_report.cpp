@@ -48,9 +48,9 @@ void addWord(std::string& line, std::string_view before, const std::string& word
   line += quoted(word);
 }
 
-void addSettings(std::string& line, std::string_view half, const std::vector<ResolvedParameter>& parameters) {
+void addSettings(std::string& line, std::string_view part, const std::vector<ResolvedParameter>& parameters) {
   for (const ResolvedParameter& one : parameters) {
-    if (one.value) addWord(line, " --set ", formatMessage("%@.%@=%@", half, one.name, *one.value));
+    if (one.value) addWord(line, " --set ", formatMessage("%@.%@=%@", part, one.name, *one.value));
   }
 }
 

@@ -75,7 +75,7 @@ void Progress::stop() {
   erase();
 }
 
-void Progress::aside(const std::function<void()>& write) {
+void Progress::printAbove(const std::function<void()>& write) {
   erase();
   write();
 }

@@ -36,9 +36,9 @@ Facts factsOf(const DiagnosticRecord& record) {
   Facts facts;
   facts.set("verdict", std::string(nameOf(record.verdict)));
   facts.set("error", oneLine(record.error));
-  for (const Part half : {Part::kExperiment, Part::kAnalysis}) {
-    for (const ResolvedParameter& one : record.parameters.of(half)) {
-      setFact(facts, formatMessage("parameter %@.%@", nameOf(half), one.name),
+  for (const Part part : {Part::kExperiment, Part::kAnalysis}) {
+    for (const ResolvedParameter& one : record.parameters.of(part)) {
+      setFact(facts, formatMessage("parameter %@.%@", nameOf(part), one.name),
               one.value ? defaultText(*one.value) : "not set");
     }
   }

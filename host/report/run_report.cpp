@@ -20,7 +20,7 @@ void RunReport::onEvent(const RunEvent& event) {
   } else if (const auto* const logged = std::get_if<Logged>(&event)) {
     const LogLine& line = logged->line;
     if (line.level > options_.shownLog) return;
-    progress_.aside([&] {
+    progress_.printAbove([&] {
       console_.err << readableLogLine(line.date, line.level, sharedLog().category(), printableLines(line.text))
                    << std::flush;
     });

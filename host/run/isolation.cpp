@@ -121,16 +121,16 @@ std::vector<std::filesystem::path> pluginsOf(const Diagnostic& one, const std::v
 }
 
 // One attempt at a scan: collects the messages of a process until it ends.
-class SurveyAttempt {
+class ScanAttempt {
  public:
-  SurveyAttempt(const IsolationOptions& options, const std::vector<std::filesystem::path>& plugins, PluginScan& survey,
-                const DiagnosticChoice& described)
+  ScanAttempt(const IsolationOptions& options, const std::vector<std::filesystem::path>& plugins, PluginScan& scan,
+              const DiagnosticChoice& described)
       : deadlines_({}, options.deadlines),
         memory_(options.memory),
         plugins_(plugins),
-        survey_(survey),
+        scan_(scan),
         described_(described),
-        known_(survey.catalogue.size()) {}
+        known_(scan.catalogue.size()) {}
 
   // Returns true if the scan is complete.
   bool perform(WatchedSignals& signals) {
@@ -148,9 +148,9 @@ class SurveyAttempt {
     }
     if (refusal_) throw CommandError(*refusal_);
     if (done_) return true;
-    if (end.how == SupervisionEnd::kInterrupted) survey_.interrupted = true;
+    if (end.how == SupervisionEnd::kInterrupted) scan_.interrupted = true;
     blame(end);
-    return survey_.interrupted;
+    return scan_.interrupted;
   }
 
   // The plug-in whose loading failed.
@@ -211,8 +211,8 @@ class SurveyAttempt {
   }
 
   void describe(DiagnosticDescription description) {
-    if (survey_.catalogue.size() >= catalogue_.size()) throw InputError("there are more descriptions than diagnostics");
-    survey_.catalogue.push_back({catalogue_[survey_.catalogue.size()], std::move(description)});
+    if (scan_.catalogue.size() >= catalogue_.size()) throw InputError("there are more descriptions than diagnostics");
+    scan_.catalogue.push_back({catalogue_[scan_.catalogue.size()], std::move(description)});
   }
 
   void beginStage(Stage stage) {
@@ -224,21 +224,21 @@ class SurveyAttempt {
   // described.
   void blame(const Supervised& end) {
     const std::chrono::nanoseconds deadline = deadlines_.of(stage_);
-    if (survey_.catalogue.size() < catalogue_.size()) {
+    if (scan_.catalogue.size() < catalogue_.size()) {
       DiagnosticDescription description;
-      description.error = errorOf(end, "describing " + catalogue_[survey_.catalogue.size()].name, deadline);
+      description.error = errorOf(end, "describing " + catalogue_[scan_.catalogue.size()].name, deadline);
       describe(std::move(description));
       return;
     }
     const std::filesystem::path file = loading_ ? std::filesystem::path(*loading_) : plugins_.back();
     failedPlugin_ = file;
-    survey_.failed.push_back({file, errorOf(end, "loading the plug-in '" + file.string() + "'", deadline)});
+    scan_.failed.push_back({file, errorOf(end, "loading the plug-in '" + file.string() + "'", deadline)});
   }
 
   const Deadlines deadlines_;
   const std::optional<std::uint64_t> memory_;
   const std::vector<std::filesystem::path>& plugins_;
-  PluginScan& survey_;
+  PluginScan& scan_;
   const DiagnosticChoice& described_;
   const std::size_t known_;
   std::vector<Diagnostic> catalogue_;
@@ -382,17 +382,17 @@ IsolationOptions withoutFailed(IsolationOptions options, const std::vector<Faile
 }
 
 PluginScan scanPlugins(const IsolationOptions& options, WatchedSignals& signals, const DiagnosticChoice& described) {
-  PluginScan survey;
+  PluginScan scan;
   std::vector<std::filesystem::path> plugins = options.plugins;
   while (!plugins.empty()) {
-    SurveyAttempt attempt(options, plugins, survey, described);
+    ScanAttempt attempt(options, plugins, scan, described);
     if (attempt.perform(signals)) break;
     if (!attempt.failedPlugin()) continue;
-    survey.catalogue.clear();  // an earlier attempt may have found the diagnostics of that plug-in
+    scan.catalogue.clear();  // an earlier attempt may have found the diagnostics of that plug-in
     // If the child reports a plug-in that was not in the list, its messages cannot be trusted.
     if (std::erase(plugins, *attempt.failedPlugin()) == 0) plugins.clear();
   }
-  return survey;
+  return scan;
 }
 
 bool runIsolated(const IsolationOptions& options, WatchedSignals& signals, const Diagnostic& diagnostic,

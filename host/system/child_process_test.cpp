@@ -31,14 +31,14 @@ std::string endOf(ChildProcess& child) {
   return child.end() ? textOf(*child.end()) : "it has not ended";
 }
 
-// Reads from the descriptor until the other end is closed or `octets` bytes have arrived.
-std::string readAll(int descriptor, std::size_t octets = SIZE_MAX) {
+// Reads from the descriptor until the other end is closed or `maximum` bytes have arrived.
+std::string readAll(int descriptor, std::size_t maximum = SIZE_MAX) {
   std::string text;
-  while (text.size() < octets) {
+  while (text.size() < maximum) {
     pollfd watched{descriptor, POLLIN, 0};
     if (::poll(&watched, 1, 60'000) != 1) return text + "... nothing more came";
     char buffer[256];
-    const ssize_t count = ::read(descriptor, buffer, std::min(sizeof buffer, octets - text.size()));
+    const ssize_t count = ::read(descriptor, buffer, std::min(sizeof buffer, maximum - text.size()));
     if (count <= 0) break;
     text.append(buffer, static_cast<std::size_t>(count));
   }
@@ -97,8 +97,8 @@ TEST_F(ChildProcessTest, HasAConnectionAndAnOutput) {
     std::printf("printed, ");
     std::fflush(stdout);
     say(STDERR_FILENO, "and complained");
-    char octet = 0;
-    if (::read(STDIN_FILENO, &octet, 1) != 0) ::_exit(1);
+    char byte = 0;
+    if (::read(STDIN_FILENO, &byte, 1) != 0) ::_exit(1);
   };
   ChildProcess child(signals_, body, std::nullopt);
   EXPECT_EQ(readAll(child.connectionDescriptor()), "said");
@@ -109,10 +109,10 @@ TEST_F(ChildProcessTest, HasAConnectionAndAnOutput) {
 TEST_F(ChildProcessTest, IsReadWithoutBlocking) {
   ChildProcess child(
       signals_, [](int) { hang(); }, std::nullopt);
-  char octet = 0;
-  EXPECT_EQ(::read(child.connectionDescriptor(), &octet, 1), -1);
+  char byte = 0;
+  EXPECT_EQ(::read(child.connectionDescriptor(), &byte, 1), -1);
   EXPECT_EQ(errno, EAGAIN);
-  EXPECT_EQ(::read(child.outputDescriptor(), &octet, 1), -1);
+  EXPECT_EQ(::read(child.outputDescriptor(), &byte, 1), -1);
   EXPECT_EQ(errno, EAGAIN);
 }
 

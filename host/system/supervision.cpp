@@ -41,15 +41,15 @@ class LineReader {
   // was too long.
   template <class Take>
   bool read(Take&& take) {
-    std::array<char, 65536> octets;
+    std::array<char, 65536> bytes;
     for (int i = 0; i < kMaxReads; ++i) {
-      const ssize_t count = ::read(descriptor_, octets.data(), octets.size());
+      const ssize_t count = ::read(descriptor_, bytes.data(), bytes.size());
       if (count < 0) return true;  // no input at the moment
       if (count == 0) {
         atEnd_ = true;
         return true;
       }
-      text_.append(octets.data(), static_cast<std::size_t>(count));
+      text_.append(bytes.data(), static_cast<std::size_t>(count));
       if (!cut(take)) return false;
     }
     return true;

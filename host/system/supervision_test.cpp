@@ -102,8 +102,8 @@ TEST_F(SupervisionTest, TakesTheLinesOfBothOutputsAndALastOneWithoutEnd) {
 }
 
 TEST_F(SupervisionTest, CutsALineOfOutputThatIsTooLong) {
-  constexpr std::size_t kOctets = 1'000'000;
-  EXPECT_EQ(run([](int) { say(STDOUT_FILENO, std::string(kOctets, 'x') + "\nend\n"); }), "ended, exit code 0");
+  constexpr std::size_t kBytes = 1'000'000;
+  EXPECT_EQ(run([](int) { say(STDOUT_FILENO, std::string(kBytes, 'x') + "\nend\n"); }), "ended, exit code 0");
   ASSERT_GT(output_.size(), 2U);
   EXPECT_EQ(output_.back(), "end");
   output_.pop_back();
@@ -112,7 +112,7 @@ TEST_F(SupervisionTest, CutsALineOfOutputThatIsTooLong) {
     EXPECT_LE(line.size(), 2U << 16);
     all += line;
   }
-  EXPECT_EQ(all, std::string(kOctets, 'x'));
+  EXPECT_EQ(all, std::string(kBytes, 'x'));
 }
 
 TEST_F(SupervisionTest, TellsExitCodesAndSignals) {

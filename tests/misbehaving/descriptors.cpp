@@ -33,9 +33,9 @@ void writeToAll(int first, std::string_view text) {
 
 // Writes all bytes, with and without a line end.
 void writeGarbageToOutput() {
-  std::string octets;
-  for (int i = 0; i < 256; ++i) octets += static_cast<char>(i);
-  writeAll(STDOUT_FILENO, octets);
+  std::string bytes;
+  for (int i = 0; i < 256; ++i) bytes += static_cast<char>(i);
+  writeAll(STDOUT_FILENO, bytes);
   writeAll(STDERR_FILENO, "\xFF\xFE\nhalf a line");
 }
 

@@ -34,12 +34,12 @@ CameraRun::CameraRun(CameraRunPlan plan, std::shared_ptr<DeliveredFrames> delive
 CameraRun::~CameraRun() { end(nullptr); }
 
 bool CameraRun::begin(DiagnosticErrorPtr* error) {
-  const bool begun = light(error) && prepare(error);
+  const bool begun = enableProjector(error) && prepare(error);
   if (!begun) end(nullptr);
   return begun;
 }
 
-bool CameraRun::light(DiagnosticErrorPtr* error) {
+bool CameraRun::enableProjector(DiagnosticErrorPtr* error) {
   if (light_.empty()) return true;
   std::vector<ControlValue> off;
   for (const ControlSetting& setting : camera_.projector->off) {
@@ -57,7 +57,7 @@ bool CameraRun::light(DiagnosticErrorPtr* error) {
 }
 
 // Destroying the guard also switches the projector off.
-bool CameraRun::darken(DiagnosticErrorPtr* error) {
+bool CameraRun::disableProjector(DiagnosticErrorPtr* error) {
   if (guard_ == nullptr) return true;
   const bool dark = node_->set(camera_.projector->off, error);
   guard_.reset();
@@ -88,7 +88,7 @@ bool CameraRun::end(DiagnosticErrorPtr* error) {
   bool succeeded = true;
   const auto note = [&](bool done) { succeeded = succeeded && done; };
   const auto firstError = [&] { return succeeded ? error : nullptr; };
-  note(darken(firstError()));
+  note(disableProjector(firstError()));
   if (video_ != nullptr) note(video_->release(firstError()));
   if (metadata_ != nullptr) note(metadata_->release(firstError()));
   const std::lock_guard lock(mutex_);

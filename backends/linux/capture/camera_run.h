@@ -54,8 +54,8 @@ class CameraRun final : public PolledStream, public CaptureRun {
   bool serve(std::span<const pollfd> polled) override;
 
  private:
-  bool light(DiagnosticErrorPtr* error);
-  bool darken(DiagnosticErrorPtr* error);
+  bool enableProjector(DiagnosticErrorPtr* error);
+  bool disableProjector(DiagnosticErrorPtr* error);
   bool prepare(DiagnosticErrorPtr* error);
   bool serveMetadata(const pollfd& polled);
   bool serveVideo(const pollfd& polled);
