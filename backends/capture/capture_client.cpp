@@ -105,7 +105,7 @@ bool CaptureClient::start(std::size_t index, DiagnosticErrorPtr* error) {
 bool CaptureClient::begin(CameraSlot& camera, const Refuser& refuse) {
   if (!checkControl(camera, refuse)) return false;
   if (camera.phase != StreamPhase::kStopped) {
-    return refuse(CaptureRefusal::kWrongState, "%@ is running already.", camera.info().name);
+    return refuse(CaptureRefusal::kWrongState, "%@ is already running.", camera.info().name);
   }
   if (!checkRates(camera, refuse)) return false;
   std::shared_ptr<CaptureRun> run = streaming_->start(*camera.back, camera.settings, refuse.error());

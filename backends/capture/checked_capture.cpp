@@ -95,7 +95,7 @@ CameraSlot* ClientDevice::cameraOf(const std::shared_ptr<CaptureStream>& stream,
   if (own != nullptr && std::ranges::find(streams_, own) != streams_.end()) {
     return &client_->slots().cameras[own->index()];
   }
-  refuse(CaptureRefusal::kForeignObject, "%@ is no stream of this device.", stream);
+  refuse(CaptureRefusal::kForeignObject, "%@ is not a stream of this device.", stream);
   return nullptr;
 }
 
@@ -129,7 +129,8 @@ bool ClientDevice::releaseAll(const CaptureStreams& streams, const Refuser& refu
     CameraSlot* const camera = cameraOf(stream, refuse);
     if (camera == nullptr || !client_->checkControl(*camera, refuse)) return false;
     if (camera->phase != StreamPhase::kStopped) {
-      return refuse(CaptureRefusal::kWrongState, "%@ is running; stop it before giving it back.", camera->info().name);
+      return refuse(CaptureRefusal::kWrongState, "%@ is running; stop it before releasing control.",
+                    camera->info().name);
     }
     if (std::ranges::find(given, camera) == given.end()) given.push_back(camera);
   }
@@ -171,18 +172,18 @@ bool ClientDevice::readGroups(const Value& value, std::vector<std::size_t>& grou
   constexpr std::string_view kGroups = capture_key::ActiveSynchronizedStreamsGroups;
   const Value* const list = entryOf(&value, kGroups);
   if (list == nullptr || list->array() == nullptr || value.dictionary()->size() != 1) {
-    return refuse(CaptureRefusal::kWrongType, "%@: %@ must be a dictionary with the one entry %@, an array.",
+    return refuse(CaptureRefusal::kWrongType, "%@: %@ must be a dictionary with exactly one entry, %@, an array.",
                   kDeviceName, capture_key::MultiCamConfiguration, kGroups);
   }
   for (const Value& element : *list->array()) {
     const auto group = std::dynamic_pointer_cast<ClientGroup>(element.object());
     if (group == nullptr || std::ranges::find(groups_, group) == groups_.end()) {
-      return refuse(CaptureRefusal::kForeignObject, "%@: %@ must hold groups of this device, not %@.", kDeviceName,
+      return refuse(CaptureRefusal::kForeignObject, "%@: %@ must contain groups of this device, not %@.", kDeviceName,
                     kGroups, described(element));
     }
     if (std::ranges::find(groups, group->index()) != groups.end()) {
-      return refuse(CaptureRefusal::kOutOfRange, "%@: %@ must hold a group once, not %@ twice.", kDeviceName, kGroups,
-                    group);
+      return refuse(CaptureRefusal::kOutOfRange, "%@: %@ must contain a group once, not %@ twice.", kDeviceName,
+                    kGroups, group);
     }
     groups.push_back(group->index());
   }

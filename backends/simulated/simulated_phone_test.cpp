@@ -163,7 +163,7 @@ TEST(SimulatedPhone, AHangInVirtualTimeEndsTheWait) {
     FAIL() << "the call returned";
   } catch (const SimulationStall& stall) {
     EXPECT_STREQ(stall.what(),
-                 "The simulated phone waits for ever: CaptureStream.start of wide hangs, at 3 s of virtual time.");
+                 "The simulated phone waits forever: CaptureStream.start of wide hangs, at 3 s of virtual time.");
   }
 }
 

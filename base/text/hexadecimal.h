@@ -13,8 +13,8 @@ namespace quazor {
 std::string hexadecimal(std::string_view bytes);
 std::string hexadecimal(std::span<const std::uint8_t> bytes);
 
-// Decodes the output of hexadecimal(). Throws InputError, "hexadecimal digits are not in pairs" or "a hexadecimal digit
-// is wrong"; uppercase digits are not accepted.
+// Decodes the output of hexadecimal(). Throws InputError, "odd number of hexadecimal digits" or "invalid hexadecimal
+// digit"; uppercase digits are not accepted.
 std::string parseHexadecimal(std::string_view text);
 
 // "0x00AC": the number with at least `digits` uppercase digits.

@@ -166,7 +166,7 @@ log error: Failed to stop steam! {error}
 back-tele stop
 back-wide stop
 device relinquish control (back-wide, back-tele, back-super-wide) -> failed
-log error: Failed to relinquish steam! SimulatedCaptureErrorDomain code 10: back-super-wide is running; stop it before giving it back.
+log error: Failed to relinquish steam! SimulatedCaptureErrorDomain code 10: back-super-wide is running; stop it before releasing control.
 )",
      "returned a result"},
     {"TheMiddleStop",
@@ -175,7 +175,7 @@ log error: Failed to relinquish steam! SimulatedCaptureErrorDomain code 10: back
 log error: Failed to stop steam! {error}
 back-wide stop
 device relinquish control (back-wide, back-tele, back-super-wide) -> failed
-log error: Failed to relinquish steam! SimulatedCaptureErrorDomain code 10: back-tele is running; stop it before giving it back.
+log error: Failed to relinquish steam! SimulatedCaptureErrorDomain code 10: back-tele is running; stop it before releasing control.
 )",
      "returned a result"},
     {"TheLastStop",
@@ -183,7 +183,7 @@ log error: Failed to relinquish steam! SimulatedCaptureErrorDomain code 10: back
      R"(back-wide stop -> failed
 log error: Failed to stop steam! {error}
 device relinquish control (back-wide, back-tele, back-super-wide) -> failed
-log error: Failed to relinquish steam! SimulatedCaptureErrorDomain code 10: back-wide is running; stop it before giving it back.
+log error: Failed to relinquish steam! SimulatedCaptureErrorDomain code 10: back-wide is running; stop it before releasing control.
 )",
      "returned a result"},
     {"TheGivingBack",

@@ -151,7 +151,7 @@ def unbind(step):
     for camera in BACK:
         expect(10 <= frames_of(entry, camera) <= 30, f"{camera} has {frames_of(entry, camera)} frames")
         expect_counters(entry, camera, DisconnectCount=1)
-    expect_not_controlled(step, "absent", NO_DEVICE, "there is none at all")
+    expect_not_controlled(step, "absent", NO_DEVICE, "there is none")
     below = underlying(step.ended_in_error("uncounted", CAPTURE, 210))
     expect_equal("the cause with an unreadable counter", (below["domain"], below["code"]), (LINUX, DEVICE_GONE))
     healthy_again(step)

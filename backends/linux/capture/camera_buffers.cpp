@@ -28,7 +28,7 @@ bool CameraBuffers::prepare(std::uint32_t count, DiagnosticErrorPtr* error) {
   if (!node_->call(VIDIOC_REQBUFS, "VIDIOC_REQBUFS", &request, error)) return false;
   requested_ = true;
   if (request.count == 0) {
-    failLinux(error, LinuxErrorCode::kSystemCall, "VIDIOC_REQBUFS on " + node_->path() + " gave no buffers.");
+    failLinux(error, LinuxErrorCode::kSystemCall, "VIDIOC_REQBUFS on " + node_->path() + " provided no buffers.");
     return false;
   }
   for (std::uint32_t index = 0; index < request.count; ++index) {

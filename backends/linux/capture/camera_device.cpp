@@ -80,8 +80,8 @@ bool LinuxCamera::applyFormat(const CameraSettings& wanted, DiagnosticErrorPtr* 
 bool LinuxCamera::applyRates(const CameraSettings& wanted, DiagnosticErrorPtr* error) {
   for (const std::optional<Value>& rate : {wanted.minimumRate, wanted.maximumRate}) {
     if (!rate || toDouble(&*rate) >= kMinRate) continue;
-    return refuseLinux(error, LinuxErrorCode::kBadValue, "%@: no driver takes less than %@ frames per second.", port(),
-                       kMinRate);
+    return refuseLinux(error, LinuxErrorCode::kBadValue, "%@: no driver supports less than %@ frames per second.",
+                       port(), kMinRate);
   }
   const bool agree =
       wanted.minimumRate && wanted.maximumRate && toDouble(&*wanted.minimumRate) <= toDouble(&*wanted.maximumRate);
@@ -100,10 +100,11 @@ std::optional<FrameInterval> LinuxCamera::intervalOf(const CameraSettings& setti
   const double rate = given->numerator == 0 ? 0 : given->framesPerSecond();
   const bool fits = rate > 0 && rate >= lowest * (1 - kRateTolerance) && rate <= highest * (1 + kRateTolerance);
   if (fits) return given;
-  refuseLinux(error, LinuxErrorCode::kNotSupported,
-              "%@: %@ does not take %@ between frames in this format; its driver gives %@ instead, which is %@ frames "
-              "per second.",
-              port(), node_->path(), textOf(wanted), textOf(*given), rate);
+  refuseLinux(
+      error, LinuxErrorCode::kNotSupported,
+      "%@: %@ does not support %@ between frames in this format; its driver uses %@ instead, which is %@ frames "
+      "per second.",
+      port(), node_->path(), textOf(wanted), textOf(*given), rate);
   return std::nullopt;
 }
 
@@ -129,7 +130,7 @@ bool LinuxCamera::checkLightSource(const CameraSettings& wanted, DiagnosticError
     const VideoControl* const control = node_->control(setting.control, error);
     if (control == nullptr) return false;
     if (!takes(*control, setting.value)) {
-      return refuseLinux(error, LinuxErrorCode::kBadValue, "%@: the control \"%@\" takes %@ to %@, not %@.", port(),
+      return refuseLinux(error, LinuxErrorCode::kBadValue, "%@: the control \"%@\" accepts %@ to %@, not %@.", port(),
                          control->name, control->minimum, control->maximum, setting.value);
     }
   }

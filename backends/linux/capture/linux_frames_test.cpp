@@ -284,7 +284,7 @@ TEST(LinuxFramesTest, WhatTheSystemRefusesAtTheStartLeavesNothingBusy) {
        [](Fake& fake) {
          fake.kernel->with(fake.nodes[kInfrared], [](FakeNode& node) { return node.mostBuffers = 0; });
        },
-       "1 VIDIOC_REQBUFS on NODE gave no buffers."},
+       "1 VIDIOC_REQBUFS on NODE provided no buffers."},
       {"no process for the guard", [](Fake& fake) { fake.kernel->guardProblem = EAGAIN; },
        "1 guarding the projector on NODE failed: Resource temporarily unavailable (EAGAIN)"},
       {"no event for the thread", [](Fake& fake) { fake.kernel->makeEventProblem = EMFILE; },

@@ -55,7 +55,7 @@ class LinuxHidDevice final : public HidDevice {
   std::string ownName() const { return node_.name.empty() ? name() : node_.name; }
 
   bool open(DiagnosticErrorPtr* error) override {
-    if (input_->descriptor() != nullptr) return refuse(error, LinuxErrorCode::kWrongState, "is open already");
+    if (input_->descriptor() != nullptr) return refuse(error, LinuxErrorCode::kWrongState, "is already open");
     FileDescriptor descriptor = calls_->open(node_.path);
     if (!descriptor) {
       const int number = errno;
@@ -81,7 +81,7 @@ class LinuxHidDevice final : public HidDevice {
     if (descriptor == nullptr) return refuse(error, LinuxErrorCode::kWrongState, "is not open");
     if (payload.empty() || payload.front() != reportID || payload.size() > kMaxFeatureLength) {
       return refuse(error, LinuxErrorCode::kBadValue,
-                    "takes feature reports that begin with their ID and have at most " +
+                    "accepts feature reports that begin with their ID and have at most " +
                         std::to_string(kMaxFeatureLength) + " bytes");
     }
     const std::chrono::nanoseconds begin = calls_->now();
@@ -116,7 +116,7 @@ class LinuxHidDevice final : public HidDevice {
     }
     const auto waited = std::chrono::floor<std::chrono::milliseconds>(time).count();
     failLinux(error, LinuxErrorCode::kNoAnswer,
-              call + " on " + name() + " failed: the device did not answer for " + std::to_string(waited) + " ms.");
+              call + " on " + name() + " failed: the device did not respond for " + std::to_string(waited) + " ms.");
   }
 
   const HidrawNode node_;

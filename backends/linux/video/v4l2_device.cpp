@@ -228,7 +228,7 @@ std::optional<std::int64_t> V4l2Device::read(const VideoControl& control, Diagno
 bool V4l2Device::set(const VideoControl& control, std::int64_t value, DiagnosticErrorPtr* error) {
   if (!takes(control, value)) {
     failLinux(error, LinuxErrorCode::kBadValue,
-              formatMessage("%@: the control \"%@\" takes %@ to %@, not %@.", path_, control.name, control.minimum,
+              formatMessage("%@: the control \"%@\" accepts %@ to %@, not %@.", path_, control.name, control.minimum,
                             control.maximum, value));
     return false;
   }

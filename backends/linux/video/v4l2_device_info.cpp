@@ -112,9 +112,9 @@ std::optional<V4l2DeviceInfo> findVideoNode(const std::vector<V4l2DeviceInfo>& n
     failLinux(error, LinuxErrorCode::kAmbiguous, text + "there are " + listOf(fitting) + ".");
     return std::nullopt;
   }
-  text += ofKind.empty() ? "there is none at all" : "there are " + listOf(ofKind);
+  text += ofKind.empty() ? "there is none" : "there are " + listOf(ofKind);
   const std::vector<const V4l2DeviceInfo*> closed = unopened(nodes);
-  if (!closed.empty()) text += "; what is behind these is not known: " + listOf(closed);
+  if (!closed.empty()) text += "; these could not be opened: " + listOf(closed);
   const bool noAccess = std::ranges::any_of(closed, [](const V4l2DeviceInfo* node) {
     return node->problem->code() == static_cast<std::int64_t>(LinuxErrorCode::kNoAccess);
   });

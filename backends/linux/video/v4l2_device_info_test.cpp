@@ -166,7 +166,7 @@ TEST_F(FindingTest, NoneOrSeveralAreToldWithWhatThereIs) {
   EXPECT_EQ(find({{}, "fake camera", {}}), "3 Port: more than one camera is card fake camera; there are " + all + ".");
   EXPECT_EQ(find({}), "3 Port: more than one camera is any; there are " + all + ".");
   nodes_.clear();
-  EXPECT_EQ(find({}), "2 Port: no camera is any; there is none at all.");
+  EXPECT_EQ(find({}), "2 Port: no camera is any; there is none.");
 }
 
 TEST_F(FindingTest, WhatCannotBeOpenedIsNamedForItMayBeTheOne) {
@@ -176,7 +176,7 @@ TEST_F(FindingTest, WhatCannotBeOpenedIsNamedForItMayBeTheOne) {
   nodes_ = videoNodes(kernel_, kernel_->roots());
   nodes_.erase(nodes_.begin(), nodes_.begin() + 3);
   EXPECT_EQ(find({"uvc", {}, {}}),
-            "4 Port: no camera is driver uvc; there is none at all; what is behind these is not known: /dev/video3 "
+            "4 Port: no camera is driver uvc; there is none; these could not be opened: /dev/video3 "
             "(open on /dev/video3 failed: Permission denied (EACCES)).");
   closed.openProblem = ENXIO;
   kernel_->add(3, closed);
@@ -197,8 +197,8 @@ TEST(OpenedVideoNodeTest, ControlsKeepTheirRangesAndTheirWidth) {
   };
   EXPECT_EQ(set("Narrow", -5), "done");
   EXPECT_EQ(node->read(*node->control("Narrow", nullptr), nullptr), -5);
-  EXPECT_EQ(set("Narrow", 6), "6 " + path + ": the control \"Narrow\" takes -5 to 5, not 6.");
-  EXPECT_EQ(set("Narrow", -6), "6 " + path + ": the control \"Narrow\" takes -5 to 5, not -6.");
+  EXPECT_EQ(set("Narrow", 6), "6 " + path + ": the control \"Narrow\" accepts -5 to 5, not 6.");
+  EXPECT_EQ(set("Narrow", -6), "6 " + path + ": the control \"Narrow\" accepts -5 to 5, not -6.");
   EXPECT_EQ(set("Wide", 1LL << 40), "done");
   EXPECT_EQ(node->read(*node->control("Wide", nullptr), nullptr), 1LL << 40);
   EXPECT_EQ(set("Button", 1), "done") << "a button has no range";

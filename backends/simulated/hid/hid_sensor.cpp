@@ -29,7 +29,7 @@ bool HidSensor::hasOpen(const std::shared_ptr<HidInbox>& user) const {
 bool HidSensor::open(const std::shared_ptr<HidInbox>& user, DiagnosticErrorPtr* error) {
   const std::lock_guard lock(mutex_);
   if (gone_) return refuse(error, HidErrorCode::kGone, "%@ has been removed.", config_.name);
-  if (hasOpen(user)) return refuse(error, HidErrorCode::kAlreadyOpen, "%@ is open already.", config_.name);
+  if (hasOpen(user)) return refuse(error, HidErrorCode::kAlreadyOpen, "%@ is already open.", config_.name);
   user->open();
   users_.push_back(user);
   startOrStop();
@@ -66,7 +66,7 @@ bool HidSensor::checkFeature(std::uint8_t reportID, std::span<const std::uint8_t
                   name, config_.name);
   }
   if (!report->accepts.empty() && !report->accepts.contains(payload[1])) {
-    return refuse(error, HidErrorCode::kRefusedReport, "Feature report %@ of %@ does not take the value %@.", name,
+    return refuse(error, HidErrorCode::kRefusedReport, "Feature report %@ of %@ does not accept the value %@.", name,
                   config_.name, payload[1]);
   }
   return true;

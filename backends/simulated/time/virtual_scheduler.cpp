@@ -132,7 +132,7 @@ void VirtualScheduler::blockUntil(const std::function<bool()>& condition, std::c
 void VirtualScheduler::stall(std::string_view what) const {
   const double seconds = static_cast<double>(now_.count()) / 1e9;
   throw SimulationStall(
-      formatMessage("The simulated phone waits for ever: %@, at %@ s of virtual time.", what, seconds));
+      formatMessage("The simulated phone waits forever: %@, at %@ s of virtual time.", what, seconds));
 }
 
 void VirtualScheduler::block(const Wait& wait) {
@@ -181,7 +181,7 @@ std::chrono::nanoseconds VirtualScheduler::nextDue(std::chrono::nanoseconds due)
 std::size_t VirtualScheduler::choose(std::size_t count) {
   if (count == 1) return 0;
   const std::size_t choice = chooser_->choose(count);
-  if (choice >= count) throw std::out_of_range("A chooser chose what there is not.");
+  if (choice >= count) throw std::out_of_range("The schedule strategy chose an event that does not exist.");
   return choice;
 }
 

@@ -172,7 +172,7 @@ TEST_F(VirtualSchedulerTest, AStallSaysWhatWasWaitedForAndWhen) {
     scheduler_.blockUntil([] { return false; }, "a lamp is to light up");
     FAIL() << "the wait returned";
   } catch (const SimulationStall& stall) {
-    EXPECT_STREQ(stall.what(), "The simulated phone waits for ever: a lamp is to light up, at 1.5 s of virtual time.");
+    EXPECT_STREQ(stall.what(), "The simulated phone waits forever: a lamp is to light up, at 1.5 s of virtual time.");
   }
 }
 

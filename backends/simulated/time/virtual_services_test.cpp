@@ -84,7 +84,7 @@ TEST_F(VirtualServicesTest, ASemaphoreThatNothingWillSignalStalls) {
     FAIL() << "the wait returned";
   } catch (const SimulationStall& stall) {
     EXPECT_STREQ(stall.what(),
-                 "The simulated phone waits for ever: a semaphore is waited for that nothing will signal, at 0 s of "
+                 "The simulated phone waits forever: a semaphore is waited for that nothing will signal, at 0 s of "
                  "virtual time.");
   }
 }
