@@ -1,2 +1,2 @@
-// Nothing but one symbol, so that the object file is not empty.
+// One symbol, because an object file must not be empty.
 extern "C" __attribute__((visibility("default"))) void quazorEmptySharedObject() {}

@@ -1,10 +1,10 @@
 #!/usr/bin/env python3
-"""Measures what it costs that plug-ins run in processes of their own.
+"""Measures the cost of running plug-ins in separate processes.
 
 usage: isolation.py BUILD
 
-BUILD is a build directory with the program, the plug-in and the benchmarks' plug-in log_flood, built for release. Exit
-code 0: all requirements are met; 1: one is missed; 2: wrong use.
+BUILD is a release build directory with the program, the plug-in and the benchmark plug-in log_flood. Exit code 0: all
+requirements are met; 1: one is missed; 2: invalid arguments.
 """
 
 import json
@@ -21,12 +21,12 @@ from requirements import Requirements
 REPETITIONS = 50
 LINES = 300_000
 FLOODS = 5
-# Virtual time: the diagnostic itself takes a few milliseconds.
+# In virtual time the diagnostic itself takes only a few milliseconds.
 DIAGNOSTIC = ("run", "CameraSyncDiagnostic.Back")
 
 
 def seconds_of(command, state):
-    """How long a command takes that must succeed. `state` is the directory of the last run's record."""
+    """The duration of a command, which must succeed. `state` is the directory for the previous run's record."""
     begin = time.perf_counter()
     subprocess.run(command, stdin=subprocess.DEVNULL, stdout=subprocess.DEVNULL, stderr=subprocess.PIPE, check=True,
                    env=dict(os.environ, XDG_STATE_HOME=str(state)))
@@ -34,7 +34,7 @@ def seconds_of(command, state):
 
 
 def lines_in(record):
-    """How many of the flood's lines a record holds, in their order; they are numbered."""
+    """The number of the flood's lines in a record. They are numbered and must be in order."""
     count = 0
     with open(record, encoding="utf-8") as file:
         for line in file:
@@ -44,8 +44,8 @@ def lines_in(record):
 
 
 def measure(build, quick=False):
-    """The medians: "child", "in process" and "list" in seconds, "lines" a second; and the lines that were "lost".
-    Nothing when a command fails."""
+    """The medians: "child", "in process" and "list" in seconds, "lines" per second; and the number of lines "lost".
+    None if a command fails."""
     print("running isolation ...", flush=True)
     try:
         return measured(build, 1 if quick else REPETITIONS, 1 if quick else FLOODS)

@@ -1,10 +1,10 @@
-// Loading the plug-in beside loading a shared object with nothing in it.
+// Loading the plug-in, compared with loading an empty shared object.
 //
 //   load_benchmark PLUG-IN EMPTY-SHARED-OBJECT [options of Google Benchmark]
 //
-// Each sample is taken in a process of its own, forked from this one, which never loads either: what dlopen does once
-// (mapping, relocation, initialisers, registration) is done anew each time. libquazor is there already, as it is in
-// a host. The child measures and tells the time through a pipe.
+// Each sample is taken in a separate process, forked from this one, which never loads either: everything that dlopen
+// does once (mapping, relocation, initialisers, registration) happens each time. libquazor is already loaded, as in a
+// host. The child measures the time and sends it through a pipe.
 #include "contract/log_channel.h"
 
 #include <benchmark/benchmark.h>
@@ -21,7 +21,7 @@
 
 namespace {
 
-// In a child: loads the file and sends the seconds it took, or nothing when it does not load.
+// Runs in the child: loads the file and sends the duration in seconds, or nothing if it cannot be loaded.
 void measureInChild(const std::string& path, int answer) {
   const auto before = std::chrono::steady_clock::now();
   void* const handle = dlopen(path.c_str(), RTLD_NOW | RTLD_LOCAL);
@@ -66,7 +66,7 @@ int main(int argc, char** argv) {
     std::fprintf(stderr, "usage: load_benchmark PLUG-IN EMPTY-SHARED-OBJECT\n");
     return 2;
   }
-  quazor::sharedLog();  // a use of libquazor, so that it is loaded
+  quazor::sharedLog();  // links libquazor, so that it is already loaded
   const auto add = [](const char* name, const std::string& path) {
     benchmark::RegisterBenchmark(name, load, path)->Iterations(100)->UseManualTime()->Unit(benchmark::kMicrosecond);
   };

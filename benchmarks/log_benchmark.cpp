@@ -1,4 +1,4 @@
-// A disabled log line beside a call of an empty function with the same arguments.
+// A disabled log line, compared with a call of an empty function with the same arguments.
 #include "contract/diagnostic_error.h"
 #include "contract/log_channel.h"
 
@@ -10,7 +10,7 @@
 namespace quazor {
 namespace {
 
-// What an inlined function that does nothing gets.
+// Takes the same arguments and does nothing.
 template <class... Arguments>
 void nothing(const char*, const Arguments&...) {}
 
@@ -20,7 +20,7 @@ struct Line {
   DiagnosticErrorPtr error = makeError("QZErrorDomain", 5, "The parameter is out of its range.");
 };
 
-// Both loops make the compiler believe that the arguments have changed, so that neither is moved out of the loop.
+// Both loops make the compiler assume that the arguments have changed, so that it cannot hoist the call.
 void emptyCall(benchmark::State& state) {
   Line line;
   for (auto _ : state) {

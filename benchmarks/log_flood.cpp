@@ -1,4 +1,4 @@
-// A plug-in whose diagnostic LogFlood logs as many lines as its parameter "count" says.
+// A plug-in whose diagnostic LogFlood logs as many lines as its parameter "count" requests.
 #include "tests/misbehaving/misbehaviour.h"
 
 namespace {

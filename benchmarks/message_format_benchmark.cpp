@@ -1,4 +1,4 @@
-// formatMessage beside libfmt, on lines that the diagnostics log.
+// formatMessage compared with libfmt, on log lines of the diagnostics.
 #include "contract/diagnostic_error.h"
 #include "contract/message_format.h"
 
@@ -12,7 +12,7 @@
 #include <string>
 #include <vector>
 
-// An error's text, as "%@" inserts it.
+// Formats an error like "%@".
 template <>
 struct fmt::formatter<quazor::DiagnosticErrorPtr> {
   constexpr auto parse(format_parse_context& context) { return context.begin(); }
@@ -26,7 +26,7 @@ struct fmt::formatter<quazor::DiagnosticErrorPtr> {
 namespace quazor {
 namespace {
 
-// Not constant for the compiler.
+// Opaque to the compiler.
 struct Arguments {
   std::uint64_t frame = 4711;
   std::int64_t index = 16;
@@ -49,7 +49,7 @@ void measure(benchmark::State& state, Format format) {
   }
 }
 
-// One line in three forms, which must make the same text. False when they do not.
+// Checks that the three implementations format a line equally.
 template <class Ours, class Libfmt, class Compiled>
 bool registerLine(const std::string& name, Ours ours, Libfmt libfmt, Compiled compiled) {
   const Arguments arguments;
@@ -69,7 +69,7 @@ bool registerLine(const std::string& name, Ours ours, Libfmt libfmt, Compiled co
   return true;
 }
 
-// A line of the log: its name, its format for us and for libfmt, and its arguments.
+// A log line: its name, its format for us and for libfmt, and its arguments.
 #define QUAZOR_LINE(name, ours, theirs, ...)                                     \
   registerLine(                                                                  \
       name, [](const Arguments& a) { return formatMessage(ours, __VA_ARGS__); }, \

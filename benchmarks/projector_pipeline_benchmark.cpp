@@ -1,5 +1,5 @@
-// The frames' way through the projector fault experiment: how long a camera is held up by a frame, how many frames a
-// second pass, and whether memory stays as it is in an hour of them.
+// The processing of frames in the projector fault experiment: how long a frame blocks the camera, the throughput in
+// frames per second, and whether memory stays constant during an hour of frames.
 #include "backends/threads/real_clock.h"
 #include "backends/threads/thread_concurrency.h"
 #include "benchmarks/projector_pipeline_peer.h"
@@ -27,7 +27,7 @@ namespace {
 
 using SteadyClock = std::chrono::steady_clock;
 
-// Real queues, and a second way to reach them.
+// Real queues that the benchmark can also access.
 class OpenConcurrency final : public Concurrency {
  public:
   std::shared_ptr<SerialQueue> makeSerialQueue(std::string_view label, QualityOfService quality) override {
@@ -44,11 +44,11 @@ class OpenConcurrency final : public Concurrency {
   ThreadConcurrency threads_;
 };
 
-// As many buffers as a camera has, in turn.
+// As many buffers as a camera has, used in turn.
 class BufferPool {
  public:
   PixelBuffer& next() { return buffers_[next_++ % buffers_.size()]; }
-  // How many references have not been given back.
+  // The number of references not yet released.
   int references() const {
     int references = 0;
     for (const HandMadeBuffer& buffer : buffers_) references += buffer.references();
@@ -60,7 +60,7 @@ class BufferPool {
   std::size_t next_ = 0;
 };
 
-// An experiment that streams, on its host's thread, until its frame number `stopCount`.
+// An experiment that streams on its own host thread until frame number `stopCount`.
 class StreamingExperiment {
  public:
   explicit StreamingExperiment(std::uint64_t stopCount) {
@@ -77,11 +77,11 @@ class StreamingExperiment {
   }
 
   void handleFrame(PixelBuffer& buffer, MediaTime time) { stream_->frameHandler()(buffer, time); }
-  // Waits until the run is over.
+  // Waits for the end of the run.
   void waitForEnd() { host_.join(); }
   bool failed() const { return !succeeded_; }
 
-  // Waits until what was delivered has been examined.
+  // Waits until all delivered frames have been examined.
   void drain() {
     std::binary_semaphore done(0);
     concurrency_->receiving->async([&] { concurrency_->processing->async([&done] { done.release(); }); });
@@ -105,7 +105,7 @@ void check(benchmark::State& state, bool failed, const BufferPool& pool) {
   if (pool.references() != 0) state.SkipWithError("buffers were kept");
 }
 
-// Keeps a queue at work, a task of 20 microseconds behind the other, as long as it lives.
+// Keeps a queue busy with consecutive tasks of 20 microseconds during its lifetime.
 class Saturation {
  public:
   explicit Saturation(SerialQueue& queue) : queue_(queue) { post(); }
@@ -139,8 +139,8 @@ double quantile(const std::vector<double>& sorted, double fraction) {
   return sorted[static_cast<std::size_t>(fraction * static_cast<double>(sorted.size() - 1))];
 }
 
-// From the call of the frame handler to its return, with all frames coming one behind the other or with a pause between
-// two. The processing queue is at work all the time.
+// From the call of the frame handler to its return, with frames in immediate succession or with a pause in between. The
+// processing queue is busy all the time.
 void handler(benchmark::State& state, std::chrono::microseconds pause) {
   const auto frames = static_cast<std::uint64_t>(state.max_iterations);
   StreamingExperiment run(frames);
@@ -170,7 +170,7 @@ void handler(benchmark::State& state, std::chrono::microseconds pause) {
 
 constexpr std::uint64_t kBurst = 100'000;
 
-// From the first frame's handler to the end of the run that the last frame brings.
+// From the first frame's handler to the end of the run, which the last frame causes.
 template <class Pipeline>
 double secondsFor(Pipeline& pipeline, BufferPool& pool) {
   const SteadyClock::time_point begin = SteadyClock::now();
@@ -201,7 +201,7 @@ void framesOfAsio(benchmark::State& state) {
   state.SetItemsProcessed(static_cast<std::int64_t>(kBurst) * state.iterations());
 }
 
-// The process's memory that is in use, in KiB; see "statm" in proc(5).
+// The resident memory of the process in KiB ("statm" in proc(5)).
 double residentKilobytes() {
   std::ifstream statm("/proc/self/statm");
   long total = 0;
@@ -210,7 +210,7 @@ double residentKilobytes() {
   return static_cast<double>(resident) * static_cast<double>(sysconf(_SC_PAGESIZE)) / 1024;
 }
 
-// An hour at 30 frames per second, as fast as the pipeline takes it in bursts of a second.
+// An hour at 30 frames per second, in bursts of one second as fast as the pipeline accepts them.
 void memory(benchmark::State& state) {
   constexpr std::uint64_t kHour = 108'000;
   constexpr std::uint64_t kSecond = 30;

@@ -1,4 +1,4 @@
-// The projector fault experiment's pipeline as one writes it on standalone Asio: for comparison.
+// The pipeline of the projector fault experiment, implemented with standalone Asio for comparison.
 #pragma once
 
 #include "contract/log_channel.h"
@@ -19,8 +19,8 @@
 
 namespace quazor {
 
-// Two strands on a pool of two threads: one takes frames in, counts them and builds their records, the other one
-// examines them. Ends with the first lit frame whose number is at least `stopCount`, or the first that fails.
+// Two strands on a pool of two threads: one receives frames, counts them and builds their records, the other one
+// examines them. Ends with the first lit frame whose number is at least `stopCount`, or with the first that fails.
 class AsioPipeline final : public std::enable_shared_from_this<AsioPipeline> {
  public:
   AsioPipeline(std::uint64_t stopCount, const Clock& clock) : stopCount_(stopCount), clock_(clock) {}
@@ -34,7 +34,7 @@ class AsioPipeline final : public std::enable_shared_from_this<AsioPipeline> {
   }
   void waitForEnd() { done_.acquire(); }
   bool failed() const { return failed_; }
-  // Ends the threads. Not on one of them.
+  // Ends the threads. Must not be called on one of them.
   void join() { pool_.join(); }
 
  private:

@@ -1,5 +1,5 @@
-// What a report channel costs a projector fault run: filter, two snapshots, their delta and the result, for phones with
-// few channels and with very many.
+// The cost of report channels in a projector fault run: filter, two snapshots, their difference and the result, for
+// phones with few and with very many channels.
 #include "diagnostics/projector_fault/fixed_clock_for_tests.h"
 #include "diagnostics/projector_fault/tessel_fault_experiment.h"
 #include "platform/concurrency.h"
@@ -19,14 +19,14 @@
 namespace quazor {
 namespace {
 
-// What this thread has used so far: all of a run is on it, and what else the machine does is not counted.
+// The processor time of this thread, which performs the whole run, so other processes have no influence.
 std::chrono::nanoseconds processorTime() {
   timespec used{};
   clock_gettime(CLOCK_THREAD_CPUTIME_ID, &used);
   return std::chrono::seconds(used.tv_sec) + std::chrono::nanoseconds(used.tv_nsec);
 }
 
-// All on the calling thread and at once, timeouts included.
+// Runs everything at once on the calling thread, including delayed tasks.
 class ImmediateQueue final : public SerialQueue {
  public:
   void async(Task task) override { task(); }
@@ -47,7 +47,7 @@ class ImmediateConcurrency final : public Concurrency {
   std::shared_ptr<Semaphore> makeSemaphore(long) override { return std::make_shared<NoSemaphore>(); }
 };
 
-// Notes the thread's processor time when it is asked.
+// Records the thread's processor time when it is called.
 class TimedReports final : public ReportFacility {
  public:
   explicit TimedReports(HandMadeReports::Descriptions channels) : reports_(std::move(channels), 5) {}
@@ -63,8 +63,8 @@ class TimedReports final : public ReportFacility {
   HandMadeReports reports_;
 };
 
-// All that a run does from its first question to the report facility on; its timeout ends the stream at once. Half of
-// the facility's channels are the run's.
+// Everything from the run's first call of the report facility on; its timeout ends the stream at once. The run uses
+// half of the facility's channels.
 void channels(benchmark::State& state) {
   const auto count = static_cast<std::size_t>(state.range(0));
   const auto reports = std::make_shared<TimedReports>(handMadeChannels(count));
@@ -77,7 +77,7 @@ void channels(benchmark::State& state) {
     if (result == nullptr || result->measurements().size() != count + 7) state.SkipWithError("the run failed");
     return taken.count();
   };
-  // The first run gets its memory from the kernel, page by page; it is shown apart.
+  // The first run allocates its memory page by page from the kernel, so it is shown separately.
   const double first = run();
   double seconds = 0;
   for (auto _ : state) {
@@ -102,7 +102,7 @@ BENCHMARK(channels)
 }  // namespace quazor
 
 int main(int argc, char** argv) {
-  // Freed memory stays with the process, so that sets of every size find it again and what is measured is our work.
+  // Keeps freed memory in the process, so that the kernel's page allocation does not distort the figures.
   mallopt(M_MMAP_MAX, 0);
   mallopt(M_TRIM_THRESHOLD, std::numeric_limits<int>::max());
   benchmark::Initialize(&argc, argv);

@@ -1,14 +1,14 @@
-"""What is required of measured figures."""
+"""Requirements on measured figures."""
 
 
 class Requirements:
-    """Prints each comparison and remembers whether one was missed."""
+    """Prints each comparison and remembers whether a requirement was missed."""
 
     def __init__(self):
         self.missed = 0
 
     def check(self, text, measured):
-        """`measured` is a function that returns (met, figures); without a figure it raises KeyError."""
+        """`measured` is a function that returns (met, figures); it raises KeyError if a figure is missing."""
         try:
             met, figures = measured()
         except KeyError as missing:
@@ -30,13 +30,13 @@ class Requirements:
         return "PASS"
 
     def exit_code(self):
-        """Says in words, too, whether one was missed."""
+        """Prints a summary and returns whether a requirement was missed."""
         print("all requirements are met" if self.missed == 0 else f"{self.missed} requirements are missed")
         return 0 if self.missed == 0 else 1
 
 
 class Figures(Requirements):
-    """Requires only that there are figures."""
+    """Only requires that the figures exist."""
 
     def accepts(self, met):
         return True

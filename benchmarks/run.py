@@ -1,12 +1,13 @@
 #!/usr/bin/env python3
-"""Runs the benchmarks, compares what has a requirement, and tells the result in the exit code.
+"""Runs the benchmarks, compares the figures with the requirements, and returns the result as exit code.
 
-DIRECTORY holds the benchmark programs, in a build directory. Every program runs its benchmarks several times, in random
-order, so that what else the machine does meets all of them alike; the medians are compared. A benchmark without a
-figure counts as a missed requirement. Exit code 0: all requirements are met; 1: one is missed; 2: wrong use.
+DIRECTORY contains the benchmark programs, in a build directory. Every program runs its benchmarks several times, in
+random order, so that other activity of the machine affects all of them alike; the medians are compared. A benchmark
+without a figure counts as a missed requirement. Exit code 0: all requirements are met; 1: one is missed; 2: invalid
+arguments.
 
---quick runs every benchmark once and shortly. It checks that each has a figure, and judges none: any machine will do.
-Exit code 0: all have a figure; 1: one has none; 2: wrong use.
+--quick runs every benchmark once and briefly. It checks that each has a figure, but does not judge the figures, so it
+works on any machine. Exit code 0: all have a figure; 1: one has none; 2: invalid arguments.
 """
 
 import argparse
@@ -21,27 +22,27 @@ from requirements import Figures, Requirements
 FULL = ("--benchmark_repetitions=7", "--benchmark_enable_random_interleaving=true",
         "--benchmark_report_aggregates_only=true")
 QUICK = ("--benchmark_min_time=0.001",)
-# Executors that keep the order of all tasks, and lists of tasks with a bare thread.
+# Executors that keep the order of all tasks, and lists of tasks with a single thread.
 PEERS = ("asio strand", "asio pool", "tbb node")
 LISTS = ("moodycamel bulk", "mutex queue")
 RUN_LOOPS = (("wake_ups", "wake-ups of two threads by each other"), ("signals", "signals from another thread"),
              ("stopped_runs", "runs that a source stops"))
 LINES = ("received frame", "event", "format index", "device supports", "session status")
-# Two queues that are woken by the same system call differ by less than this, in either direction, from run to run.
+# The variation between runs of two queues that use the same system call to wake a thread, in either direction.
 WAKE_UP_NOISE = 1.10
 
 
 class Programs:
-    """Runs the benchmark programs of a directory, once and shortly where `quick`."""
+    """Runs the benchmark programs of a directory; with `quick` once and briefly."""
 
     def __init__(self, directory, quick):
         self.directory = directory
         self.options = QUICK if quick else FULL
         self.kind = "iteration" if quick else "median"
-        self.missing = []  # the benchmarks that have ended without a figure
+        self.missing = []  # benchmarks that ended without a figure
 
     def run(self, program, *arguments):
-        """The medians of a program's benchmarks by name; when quick, their only figures."""
+        """The medians of a program's benchmarks by name; with --quick, their only figures."""
         print(f"running {program} ...", flush=True)
         command = [os.path.join(self.directory, program), *arguments]
         names = self.output([*command, "--benchmark_list_tests=true"]).split("\n")[:-1]
@@ -54,7 +55,7 @@ class Programs:
         return figures
 
     def output(self, command):
-        """What a command writes; nothing when it fails."""
+        """The output of a command; None if it fails."""
         done = subprocess.run(command, stdout=subprocess.PIPE, text=True, check=False)
         if done.returncode != 0:
             print(f"{os.path.basename(command[0])} ended with exit code {done.returncode}")

@@ -1,5 +1,5 @@
-// Run loops: how often per second two threads wake each other, how many signals per second one thread gives another,
-// and how many runs per second a thread has that handle one source and are stopped by it.
+// Run loops: wake-ups per second between two threads, signals per second from one thread to another, and runs per
+// second that handle one source and are stopped by it.
 #include "benchmarks/run_loop_peers.h"
 
 #include <benchmark/benchmark.h>
@@ -18,7 +18,8 @@ namespace {
 
 constexpr std::size_t kSources = 32;
 
-// A thread whose loop runs until this object goes. `handler` is called on the thread, but for the last signal.
+// A thread whose loop runs during the lifetime of this object. `handler` is called on the thread, except for the last
+// signal.
 template <class Loop>
 class LoopThread {
  public:
@@ -57,7 +58,7 @@ class LoopThread {
   std::thread thread_;
 };
 
-// A signal there, its handler's signal here: two wake-ups.
+// Signals the other thread, whose handler signals back: two wake-ups.
 template <class Loop>
 void wakeUps(benchmark::State& state) {
   Loop here([] {});
@@ -69,7 +70,7 @@ void wakeUps(benchmark::State& state) {
   state.SetItemsProcessed(state.iterations() * 2);
 }
 
-// Signals of one source after the other at full speed, none again before all have been handled.
+// Signals one source after the other at full speed, and none again before all have been handled.
 template <class Loop>
 void signals(benchmark::State& state) {
   std::size_t handled = 0;

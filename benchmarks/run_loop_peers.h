@@ -1,4 +1,4 @@
-// The run loops that run_loop_benchmark compares: ours, those that also wait for descriptors, and GLib's main loop.
+// The run loops in run_loop_benchmark: ours, the one that also waits for descriptors, and GLib's main loop.
 #pragma once
 
 #include "backends/linux/system/descriptor_run_loop.h"
@@ -15,7 +15,7 @@
 
 namespace quazor {
 
-// Sources with one handler on a loop of the thread that makes this. All calls on that thread, but signal and stop.
+// Sources with one handler on a loop of the constructing thread. All calls on that thread, except signal and stop.
 class LoopWithSources {
  public:
   LoopWithSources(RunLoop& loop, const std::function<void()>& handler, std::size_t sources) : loop_(loop) {
@@ -32,9 +32,9 @@ class LoopWithSources {
 
   void signal(std::size_t source = 0) { sources_[source]->signal(); }
   void stop() { loop_.stop(); }
-  // Until stop.
+  // Runs until stop().
   void run() { loop_.runInMode(kRunLoopDefaultMode, std::chrono::nanoseconds::max(), false); }
-  // Until a source was handled.
+  // Runs until a source was handled.
   void runOnce() { loop_.runInMode(kRunLoopDefaultMode, std::chrono::nanoseconds::max(), true); }
 
  private:
@@ -54,7 +54,7 @@ class DescriptorLoop : public LoopWithSources {
       : LoopWithSources(*makeLinuxRunLoops()->currentRunLoop(), handler, sources) {}
 };
 
-// The same with sources whose ready time is set: the cheapest signal that GLib has for a source that lasts.
+// The same with GLib. Setting a source's ready time is GLib's cheapest signal for a permanent source.
 class GLibLoop {
  public:
   explicit GLibLoop(std::function<void()> handler, std::size_t sources = 1)

@@ -1,4 +1,4 @@
-// What an image of the display sensor costs: reading its record, beside a plain copy of the samples that are kept, and
+// The cost of an image of the display sensor: parsing its record, compared with a plain copy of the stored samples, and
 // the way of a report from the device's callback through stream and experiment.
 #include "diagnostics/sensor_images/nimbe_image_experiment.h"
 #include "tests/support/hand_made_sensor.h"
@@ -26,7 +26,7 @@ NimbeImageRecord imageRecord() {
   return record;
 }
 
-// Both loops make the compiler believe that the record has changed and that what is kept of it is read.
+// Both loops make the compiler assume that the record has changed and that the stored data is read.
 void copySamples(benchmark::State& state) {
   NimbeImageRecord record = imageRecord();
   for (auto _ : state) {
@@ -48,7 +48,7 @@ void readRecord(benchmark::State& state) {
   }
 }
 
-// As the result holds it: every sample a Value.
+// Converted as in the result: every sample becomes a Value.
 void readValues(benchmark::State& state) {
   const QZNimbeCorvaneImage image(imageRecord());
   for (auto _ : state) {
@@ -57,7 +57,7 @@ void readValues(benchmark::State& state) {
   }
 }
 
-// The images are kept, as in every run, so a run gets as many reports as a long capture has.
+// The images are kept, as in every run, so a run gets as many reports as a long capture.
 void callback(benchmark::State& state) {
   HandMadeSensor sensor({});
   const auto experiment = std::make_shared<QZNimbeImageExperiment>(sensor.platform());

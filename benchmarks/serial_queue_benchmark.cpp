@@ -1,4 +1,4 @@
-// Serial queues: tasks per second with one and two producers, and how long an idle queue takes to start a task.
+// Serial queues: tasks per second with one and two producers, and the time in which an idle queue starts a task.
 #include "benchmarks/serial_queue_peers.h"
 
 #include <benchmark/benchmark.h>
@@ -17,13 +17,13 @@
 namespace quazor {
 namespace {
 
-// Each producer posts this many tasks at full speed, and then waits until its last one has run.
+// Each producer posts this many tasks at full speed and then waits for its last one.
 constexpr int kBurst = 100'000;
 
 template <class Queue>
 void throughput(benchmark::State& state) {
   static std::unique_ptr<Queue> queue;
-  static long counter;  // raised by every task, without any synchronisation but the queue's
+  static long counter;  // incremented by every task, synchronised only by the queue
   if (state.thread_index() == 0) {
     queue = std::make_unique<Queue>();
     counter = 0;
@@ -51,7 +51,7 @@ double quantile(const std::vector<double>& sorted, double fraction) {
 
 using SteadyClock = std::chrono::steady_clock;
 
-// From before the post to the first instruction of the task, after two milliseconds without work; in nanoseconds.
+// The time in nanoseconds from the post to the first instruction of the task, after two idle milliseconds.
 template <class Queue>
 double nanosecondsToWake(Queue& queue) {
   std::this_thread::sleep_for(std::chrono::milliseconds(2));
@@ -66,7 +66,7 @@ double nanosecondsToWake(Queue& queue) {
   return std::chrono::duration<double, std::nano>(started - posted).count();
 }
 
-// A queue under measurement and what was measured.
+// A queue and its measurements.
 struct WakeUps {
   std::string name;
   std::function<double()> measure;
@@ -78,7 +78,7 @@ WakeUps wakeUpsOf(const std::string& name) {
   return {name, [queue = std::make_shared<Queue>()] { return nanosecondsToWake(*queue); }, {}};
 }
 
-// The queues take turns, in another order each time, so that what else the machine does meets all of them alike.
+// The queues take turns in varying order, so that other activity of the machine affects all of them alike.
 void wakeUp(benchmark::State& state) {
   std::vector<WakeUps> queues = {wakeUpsOf<QuazorQueue>("quazor"),
                                  wakeUpsOf<AsioStrand>("asio strand"),

@@ -1,4 +1,4 @@
-// The serial queues that serial_queue_benchmark compares: ours, and five others with the same call.
+// The serial queues in serial_queue_benchmark: ours, and five others with the same interface.
 #pragma once
 
 #include "backends/threads/thread_serial_queue.h"
@@ -21,7 +21,7 @@
 
 namespace quazor {
 
-// Ours, through the interface that everybody uses.
+// Ours, through its public interface.
 class QuazorQueue {
  public:
   template <class Function>
@@ -76,7 +76,7 @@ class TbbNode {
  private:
   using Callable = std::function<void()>;
 
-  // One worker thread beside the calling one, on a machine of any size.
+  // one worker thread in addition to the calling one, on any machine
   tbb::global_control control_{tbb::global_control::max_allowed_parallelism, 2};
   tbb::flow::graph graph_;
   tbb::flow::function_node<Callable> node_{graph_, tbb::flow::serial, [](const Callable& callable) {
@@ -85,8 +85,8 @@ class TbbNode {
                                            }};
 };
 
-// moodycamel's queue, whose only consumer takes tasks in bulk. It keeps the order of each producer's tasks, and none
-// across producers.
+// moodycamel's queue with a single consumer that takes tasks in bulk. It keeps the order of each producer's tasks, but
+// not the order across producers.
 class MoodycamelBulk {
  public:
   MoodycamelBulk() : thread_([this] { run(); }) {}
@@ -115,11 +115,11 @@ class MoodycamelBulk {
   }
 
   moodycamel::BlockingConcurrentQueue<Task> waiting_;
-  bool closed_ = false;  // the consumer's own
+  bool closed_ = false;  // used only by the consumer
   std::thread thread_;
 };
 
-// What one writes by hand: a vector under a mutex, which the thread exchanges for its own empty one.
+// A hand-written queue: a vector under a mutex, which the thread swaps with its own empty one.
 class MutexQueue {
  public:
   MutexQueue() : thread_([this] { run(); }) {}

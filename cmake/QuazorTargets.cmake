@@ -1,4 +1,4 @@
-# How this project declares its targets.
+# Functions that declare the project's targets.
 
 # A tree with tests links a hundred programs, and mold takes a tenth of the time of binutils' linker.
 if(QUAZOR_TESTS)
@@ -10,7 +10,7 @@ endif()
 
 set(QUAZOR_WARNINGS -Wall -Wextra -Wpedantic -Wconversion -Wshadow -Wnon-virtual-dtor)
 
-# What every target of ours is compiled with. Nothing of it reaches a target of somebody else.
+# Sets the compiler options of the project's targets. They are PRIVATE and do not affect other targets.
 function(quazor_configure target)
   target_compile_features(${target} PUBLIC cxx_std_20)
   target_compile_options(${target} PRIVATE ${QUAZOR_WARNINGS})
@@ -21,14 +21,14 @@ function(quazor_configure target)
                         VISIBILITY_INLINES_HIDDEN ON POSITION_INDEPENDENT_CODE ON)
   set_target_properties(${target} PROPERTIES UNITY_BUILD ${QUAZOR_UNITY} UNITY_BUILD_BATCH_SIZE 8)
   if(CMAKE_CXX_COMPILER_ID STREQUAL GNU)
-    # g++ collects its garbage from 30 MB on, an eighth of the time that our sources take; half a GB is there.
+    # By default g++ runs its garbage collector from 30 MB on, which takes an eighth of the compile time. Allow 512 MB.
     target_compile_options(${target} PRIVATE "SHELL:--param ggc-min-expand=300"
                            "SHELL:--param ggc-min-heapsize=524288")
   endif()
   if(QUAZOR_SANITIZE)
     target_compile_options(${target} PRIVATE -fsanitize=${QUAZOR_SANITIZE} -fno-sanitize-recover=all
                            -fno-omit-frame-pointer)
-    # clang's check of vtable pointers opens a pipe, and takes every object for a bad one where a test has used up all
+    # clang's check of vtable pointers opens a pipe, and reports every object as invalid if a test has used up all
     # descriptors.
     if(CMAKE_CXX_COMPILER_ID MATCHES Clang)
       target_compile_options(${target} PRIVATE -fno-sanitize=vptr)
@@ -43,14 +43,14 @@ function(quazor_configure target)
     endforeach()
   endif()
   if(QUAZOR_COVERAGE)
-    # Several threads count at once.
+    # Several threads update the counters.
     target_compile_options(${target} PRIVATE --coverage -fno-inline -fprofile-update=atomic)
     target_link_options(${target} PRIVATE --coverage)
   endif()
 endfunction()
 
-# Parsing the headers that nearly every source includes is a third of a build, so they are parsed once: the first
-# target of a kind keeps the result for the others of its kind.
+# Parsing the most common headers takes a third of a build, so they are precompiled: the first target of a kind owns the
+# result and the others reuse it.
 function(quazor_precompile target kind)
   if(NOT QUAZOR_UNITY)
     return()
@@ -67,7 +67,7 @@ endfunction()
 set(QUAZOR_COMMON_HEADERS <algorithm> <chrono> <cstdint> <filesystem> <functional> <map> <memory> <mutex> <optional>
                           <sstream> <string> <string_view> <unordered_map> <utility> <variant> <vector>)
 
-# quazor_library(NAME SOURCES ... DEPENDS ...): a folder's own static library, linked as quazor::NAME.
+# quazor_library(NAME SOURCES ... DEPENDS ...): a static library of one folder, linked as quazor::NAME.
 function(quazor_library name)
   cmake_parse_arguments(ARG "" "" "SOURCES;DEPENDS" ${ARGN})
   add_library(quazor_${name} STATIC ${ARG_SOURCES})
@@ -88,23 +88,23 @@ function(quazor_library name)
   endif()
 endfunction()
 
-# quazor_plugin(NAME SOURCES ... DEPENDS ...): a loadable plug-in NAME.so, beside which the host finds it.
+# quazor_plugin(NAME SOURCES ... DEPENDS ...): a loadable plug-in NAME.so in the directory that the host searches.
 function(quazor_plugin name)
   cmake_parse_arguments(ARG "" "" "SOURCES;DEPENDS" ${ARGN})
   add_library(${name} MODULE ${ARG_SOURCES})
   target_include_directories(${name} PRIVATE ${PROJECT_SOURCE_DIR})
   target_link_libraries(${name} PRIVATE ${ARG_DEPENDS})
   quazor_configure(${name})
-  # Whatever a plug-in uses it must name: a symbol that nothing provides is found when it is linked.
+  # Makes undefined symbols linker errors: a plug-in must link everything that it uses.
   target_link_options(${name} PRIVATE -Wl,--no-undefined -Wl,--exclude-libs,ALL)
   if(QUAZOR_SANITIZE AND CMAKE_CXX_COMPILER_ID MATCHES Clang)
-    target_link_options(${name} PRIVATE -Wl,-z,undefs)  # clang leaves the sanitizer's runtime to the program
+    target_link_options(${name} PRIVATE -Wl,-z,undefs)  # clang resolves the sanitizer's runtime in the program
   endif()
   set_target_properties(${name} PROPERTIES PREFIX "" INSTALL_RPATH "$ORIGIN/.."
                         LIBRARY_OUTPUT_DIRECTORY ${PROJECT_BINARY_DIR}/${QUAZOR_PLUGIN_DIRECTORY})
 endfunction()
 
-# quazor_test(NAME SOURCES ... DEPENDS ...): a test program of GoogleTest cases, and its CTest entry.
+# quazor_test(NAME SOURCES ... DEPENDS ...): a GoogleTest program and its CTest entry.
 function(quazor_test name)
   if(NOT QUAZOR_TESTS)
     return()

@@ -1,11 +1,11 @@
-# For the scripts of this project; sourced, with `root` set to the project's folder.
+# Functions for the scripts of this project. Source it with `root` set to the project's directory.
 
 say() { printf '%s\n' "$*" >&2; }
 
-# Where builds go: build/ of the checkout, or the folder that QUAZOR_BUILD_DIR names.
+# Build directories are below build/ in the checkout, or below QUAZOR_BUILD_DIR if it is set.
 build_root=${QUAZOR_BUILD_DIR:-$root/build}
 
-# install_packages PACKAGE...: installs what is missing, on Debian and its kin, after saying so.
+# install_packages PACKAGE...: installs missing packages on Debian and derivatives, after printing their names.
 install_packages() {
   if ! command -v dpkg-query >/dev/null 2>&1 || ! command -v apt-get >/dev/null 2>&1; then
     say "This is not a Debian system: if the build fails, install what these Debian packages hold: $*"
@@ -35,7 +35,7 @@ install_packages() {
   rm -f "$log"
 }
 
-# check_cmake: refuses a CMake that is missing or too old, before it complains in its own words.
+# check_cmake: fails with a clear message if CMake is missing or too old.
 check_cmake() {
   local needed=3.25 found
   found=$(cmake --version 2>/dev/null | sed -n '1s/.*version \([0-9.]*\).*/\1/p') || true
@@ -49,7 +49,7 @@ check_cmake() {
   fi
 }
 
-# claim_build_folder DIRECTORY: makes the folder of a build, or says why that cannot be and what to do instead.
+# claim_build_folder DIRECTORY: creates a build directory, or prints why it cannot and what to do.
 claim_build_folder() {
   local directory=$1 elsewhere="Build elsewhere: QUAZOR_BUILD_DIR=/some/folder $0"
   if ! mkdir -p "$directory" 2>/dev/null; then
@@ -60,7 +60,7 @@ claim_build_folder() {
     say "The build in $directory belongs to $(stat -c %U "$directory"), and you may not write there. $elsewhere"
     return 1
   fi
-  # CMake refuses a build that was configured for another folder, as after a copy or a move of the checkout.
+  # CMake rejects a build directory that was configured for another source directory, for example after a move.
   local configured_for
   configured_for=$(sed -n 's/^CMAKE_HOME_DIRECTORY:INTERNAL=//p' "$directory/CMakeCache.txt" 2>/dev/null) || true
   if [ -n "$configured_for" ] && [ "$configured_for" != "$root" ]; then
@@ -69,8 +69,8 @@ claim_build_folder() {
   fi
 }
 
-# show_progress LOG: copies what ninja prints into the log, and tells how many steps of all are done: in one line of a
-# terminal, elsewhere in a line every 15 s. A build that ends within a second says nothing.
+# show_progress LOG: copies the output of ninja to the log and shows the number of completed steps: in one line of a
+# terminal, otherwise in a line every 15 s. Prints nothing for a build that takes less than a second.
 show_progress() {
   local line shown=0 told=$SECONDS begin=$SECONDS
   while IFS= read -r line; do
@@ -89,8 +89,8 @@ show_progress() {
   [ $shown -eq 0 ] || printf '\r\033[K' >&2
 }
 
-# build DIRECTORY TARGETS CMAKE_OPTION...: configures once and builds what has changed, with progress; prints its output
-# only when it fails.
+# build DIRECTORY TARGETS CMAKE_OPTION...: configures once and builds, with progress; prints the output of the build
+# only if it fails.
 build() {
   local directory=$1 targets=$2
   shift 2

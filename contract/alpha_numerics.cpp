@@ -10,11 +10,11 @@ namespace QUAZOR_CONTRACT {
 
 namespace {
 
-// What the first byte of a character in UTF-8 tells (the Unicode Standard, chapter 3, table 3-7).
+// The information in the first byte of a UTF-8 character (the Unicode Standard, chapter 3, table 3-7).
 struct LeadByte {
-  std::size_t length;  // of the character in bytes; 0 when no character begins with this byte
-  char32_t bits;       // those of the code point that this byte holds
-  char32_t lowest;     // the first code point that needs so many bytes
+  std::size_t length;  // of the character in bytes; 0 if no character begins with this byte
+  char32_t bits;       // the bits of the code point in this byte
+  char32_t lowest;     // the first code point that needs that many bytes
 };
 
 LeadByte readLeadByte(unsigned char byte) {
@@ -26,9 +26,8 @@ LeadByte readLeadByte(unsigned char byte) {
   return {0, 0, 0};
 }
 
-// Takes the first character off `text`, which is not empty; nothing when its bytes are not of UTF-8's scheme. What the
-// scheme could hold but no well-formed text does, surrogates and numbers beyond the last code point, is given as it is:
-// no range of the table has it.
+// Removes the first character from `text`, which must not be empty; returns nothing if its bytes do not follow the
+// scheme of UTF-8. May return surrogates and numbers beyond the last code point; no range of the table contains them.
 std::optional<char32_t> takeCharacter(std::string_view& text) {
   const LeadByte lead = readLeadByte(static_cast<unsigned char>(text.front()));
   if (lead.length == 0 || text.size() < lead.length) return std::nullopt;

@@ -7,8 +7,8 @@
 
 namespace QUAZOR_CONTRACT {
 
-// True when every character of `utf8` is a letter, a mark or a number of any script (Unicode's general categories
-// L*, M* and N*); so is an empty text. False for text that is not well-formed UTF-8. Any thread.
+// Returns true if every character of `utf8` is a letter, a mark or a number of any script (Unicode's general categories
+// L*, M* and N*), and for an empty text. Returns false if the text is not well-formed UTF-8. Any thread.
 QUAZOR_EXPORT bool isAlphaNumeric(std::string_view utf8);
 
 }  // namespace QUAZOR_CONTRACT

@@ -11,7 +11,7 @@ struct CodePointRange {
   char32_t last;
 };
 
-// Every letter, mark and number: sorted, without overlap, and with a gap between any two ranges.
+// All letters, marks and numbers: sorted ranges, not overlapping and not adjacent.
 std::span<const CodePointRange> alphaNumericRanges();
 
 }  // namespace quazor

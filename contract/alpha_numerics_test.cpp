@@ -10,7 +10,7 @@
 namespace quazor {
 namespace {
 
-// The bytes that UTF-8's scheme gives a code point of up to 21 bits; not all of them are well-formed.
+// Encodes a code point of up to 21 bits like UTF-8; the result is not always well-formed.
 std::string encoded(char32_t codePoint) {
   const auto byte = [](char32_t bits) { return static_cast<char>(static_cast<unsigned char>(bits)); };
   const auto tail = [&](unsigned shift) { return byte(0x80U | ((codePoint >> shift) & 0x3FU)); };
@@ -29,7 +29,7 @@ TEST(AlphaNumericsTest, EveryCodePointIsJudgedAsIcuCategorisesIt) {
     ASSERT_EQ(isAlphaNumeric(encoded(codePoint)), expected) << "U+" << std::hex << static_cast<unsigned>(codePoint);
     alphaNumeric += expected ? 1 : 0;
   }
-  EXPECT_GT(alphaNumeric, 130'000);  // the comparison saw letters at all
+  EXPECT_GT(alphaNumeric, 130'000);  // rules out a comparison without letters
 }
 
 TEST(AlphaNumericsTest, TextsAreJudgedByEveryCharacterInThem) {

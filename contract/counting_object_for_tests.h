@@ -1,4 +1,4 @@
-// An object that counts how often it is made into text.
+// An object that counts its conversions to text.
 #pragma once
 
 #include "contract/value.h"

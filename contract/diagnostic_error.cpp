@@ -29,7 +29,7 @@ Dictionary DiagnosticError::dictionaryRepresentation() const {
   const auto entries = [](const DiagnosticError& error) {
     return Dictionary{{"message", error.localizedDescription()}, {"code", error.code()}, {"domain", error.domain()}};
   };
-  // From the root cause outwards: a chain may be longer than the stack is deep.
+  // From the root cause outwards, without recursion, because a chain may be long.
   std::optional<Dictionary> representation;
   for (auto cause = causes.rbegin(); cause != causes.rend(); ++cause) {
     Dictionary outer = entries(**cause);

@@ -40,7 +40,7 @@ class QUAZOR_EXPORT DiagnosticError {
   std::string localizedDescription() const;
   // The error that caused this one, or null.
   DiagnosticErrorPtr underlyingError() const;
-  // "message", "code", "domain" and, only where there is one, "underlying-error" with that error's own dictionary.
+  // "message", "code", "domain" and, if there is an underlying error, "underlying-error" with that error's dictionary.
   Dictionary dictionaryRepresentation() const;
 
  private:

@@ -57,7 +57,7 @@ def categorised_ranges(lines):
 
 
 def alpha_numeric_ranges(lines):
-    """The ranges of letters, marks and numbers, adjoining ones joined, in order."""
+    """The sorted ranges of letters, marks and numbers; adjacent ranges are merged."""
     ranges = []
     for first, last, category in categorised_ranges(lines):
         if category[0] not in "LMN":

@@ -26,11 +26,11 @@ void LogChannel::setBackend(std::shared_ptr<LogBackend> backend, LogLevel level)
     threshold_.store(backend == nullptr ? 0 : static_cast<int>(level), std::memory_order_relaxed);
     backend_.swap(backend);
   }
-  // The back-end before goes here, outside the lock.
+  // The previous backend is destroyed here, outside the lock.
 }
 
 LogChannel& sharedLog() {
-  // Never released: a task that outlives the host's main function may still write a line.
+  // Never destroyed: a task that outlives the host's main function may still write a line.
   static auto* const channel = new LogChannel("org.quazor.camera-sensor-diagnostics", "quazor");
   return *channel;
 }

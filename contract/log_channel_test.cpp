@@ -15,10 +15,10 @@
 #include <vector>
 
 namespace {
-thread_local long allocations = 0;  // by this thread, through operator new
+thread_local long allocations = 0;  // by operator new on this thread
 }
 
-// The replaced operators count. They stand for the whole test program, which otherwise does not notice.
+// The replaced operators count allocations. They apply to the whole test program.
 void* operator new(std::size_t size) {
   ++allocations;
   if (void* memory = std::malloc(size == 0 ? 1 : size)) return memory;
@@ -154,7 +154,7 @@ TEST_F(LogChannelTest, AnEnabledLineFormatsOnce) {
   const long before = allocations;
   logError("%@ and some more text than fits into a short string", object);
   EXPECT_EQ(object->asked, 1);
-  EXPECT_GT(allocations, before);  // the counter above counts
+  EXPECT_GT(allocations, before);  // proves that the counter works
 }
 
 TEST_F(LogChannelTest, ABackendMayBeReplacedWhileOtherThreadsWrite) {

@@ -19,7 +19,7 @@ void appendShortest(std::string& out, Number number) {
 }
 
 void appendFixed(std::string& out, double number) {
-  // A sign, every digit before the point that a double can have, the point and six digits.
+  // Room for a sign, the integer digits of the largest double, the point and six digits.
   char digits[std::numeric_limits<double>::max_exponent10 + 10];
   const auto end = std::to_chars(digits, digits + sizeof digits, number, std::chars_format::fixed, 6).ptr;
   out.append(digits, end);
@@ -36,7 +36,7 @@ void appendDate(std::string& out, Date date) {
   const auto day = std::chrono::floor<std::chrono::days>(second);
   const std::chrono::year_month_day calendar(day);
   const std::chrono::hh_mm_ss clock(second - day);
-  // A 64-bit count of nanoseconds reaches from the year 1677 to 2262: four digits, no sign.
+  // 64-bit nanoseconds cover the years 1677 to 2262: four digits, no sign.
   appendPadded(out, static_cast<unsigned>(static_cast<int>(calendar.year())), 4);
   out += '-';
   appendPadded(out, static_cast<unsigned>(calendar.month()), 2);

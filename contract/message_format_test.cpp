@@ -26,7 +26,7 @@ constexpr double kMaxDouble = std::numeric_limits<double>::max();
 constexpr double kInfinity = std::numeric_limits<double>::infinity();
 constexpr double kNan = std::numeric_limits<double>::quiet_NaN();
 
-// What the compiler refuses, and for which reason.
+// The formats that the compiler rejects, and the reasons.
 static_assert(checkFormat<>("") == FormatFault::kNone);
 static_assert(checkFormat<>("plain, and 100%%") == FormatFault::kNone);
 static_assert(checkFormat<>("%%@") == FormatFault::kNone);
@@ -55,7 +55,7 @@ static_assert(checkFormat<bool>("%lu") == FormatFault::kArgumentOfWrongType);
 static_assert(checkFormat<int>("%lf") == FormatFault::kArgumentOfWrongType);
 static_assert(checkFormat<Value>("%lf") == FormatFault::kArgumentOfWrongType);
 static_assert(checkFormat<int, int>("%d%lu") == FormatFault::kArgumentOfWrongType);
-// The small integers fit.
+// Small integer types are accepted.
 static_assert(checkFormat<short, signed char>("%d%d") == FormatFault::kNone);
 static_assert(checkFormat<std::uint8_t, std::uint64_t>("%lu%lu") == FormatFault::kNone);
 
@@ -132,7 +132,7 @@ TEST(FormatMessageTest, WritesTheLargestDoublesWithAllTheirDigits) {
   }
 }
 
-// Every row is written twice: as an argument of its own type and as a Value.
+// Each value is formatted twice: with its own type and as a Value.
 TEST(DefaultTextTest, IsTheSameForAnArgumentAndForAValueOfIt) {
   const auto check = [](const auto& argument, const char* expected) {
     EXPECT_EQ(formatMessage("%@", argument), expected);
@@ -260,7 +260,7 @@ TEST(DefaultTextTest, IsAppendedToWhatIsThere) {
   EXPECT_EQ(text, "before 5");
 }
 
-// Numbers with a decimal comma and grouped digits: what a careless formatter would take over.
+// A locale with a decimal comma and grouped digits, which must have no effect.
 class CommaPunctuation : public std::numpunct<char> {
   char do_decimal_point() const override { return ','; }
   char do_thousands_sep() const override { return '.'; }

@@ -35,8 +35,8 @@ class OrderedMap {
   void set(std::string_view key, T value) { setHashed(key, slots_.empty() ? 0 : hashOf(key), std::move(value)); }
 
   // Sets each element's value under its key, in the order of `elements`, which is indexed from 0. The keys, views or
-  // references, outlive the call. With very many elements faster than a set() for each: the index is larger than the
-  // processor's caches then, and its places are fetched ahead.
+  // references, must outlive the call. Faster than repeated set() for very many elements, because it prefetches the
+  // slots of an index that exceeds the processor's caches.
   template <class Elements, class KeyOf, class ValueOf>
   void setAll(const Elements& elements, KeyOf keyOf, ValueOf valueOf) {
     constexpr std::size_t kAhead = 16;
@@ -110,7 +110,7 @@ class OrderedMap {
 
   Entry* findEntry(std::string_view key) { return findEntry(key, slots_.empty() ? 0 : hashOf(key)); }
 
-  // `hash` is the key's where there is an index.
+  // `hash` is the hash of `key`; it is only used if there is an index.
   Entry* findEntry(std::string_view key, std::uint32_t hash) {
     if (slots_.empty()) {
       for (Entry& entry : entries_) {
@@ -127,7 +127,7 @@ class OrderedMap {
     return nullptr;
   }
 
-  // `hash` is the key's where there is an index.
+  // `hash` is the hash of `key`; it is only used if there is an index.
   void setHashed(std::string_view key, std::uint32_t hash, T&& value) {
     if (Entry* entry = findEntry(key, hash)) {
       entry->second = std::move(value);
@@ -141,7 +141,7 @@ class OrderedMap {
     }
   }
 
-  // An index with room for `count` entries.
+  // Builds an index with room for `count` entries.
   void rebuildIndex(std::size_t count) {
     std::size_t size = kScanLimit * 4;
     while (size < count * 2) size *= 2;
@@ -157,7 +157,8 @@ class OrderedMap {
   }
 
   std::vector<Entry> entries_;
-  std::vector<Slot> slots_;  // empty, or a power of two and at most half full; never empty beyond kScanLimit entries
+  // Empty, or a power of two and at most half full. Not empty if there are more than kScanLimit entries.
+  std::vector<Slot> slots_;
 };
 
 }  // namespace QUAZOR_CONTRACT

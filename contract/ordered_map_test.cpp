@@ -25,7 +25,7 @@ Counts mapOf(int count) {
   return map;
 }
 
-// Sizes around which the map goes over to its index (9 entries) and makes it anew.
+// Sizes around the creation of the index (9 entries) and around its rebuilds.
 constexpr int kSizes[] = {0, 1, 7, 8, 9, 16, 17, 64, 65, 1000};
 
 TEST(OrderedMapTest, IsMadeEmpty) {
@@ -89,7 +89,7 @@ TEST(OrderedMapTest, TheLastOfEqualKeysInAListHolds) {
 TEST(OrderedMapTest, SettingAllIsSettingOneBehindTheOther) {
   for (const int size : kSizes) {
     for (const int earlier : {0, 3, 20}) {
-      // Every third key comes twice, and some were there before.
+      // Every third key occurs twice, and some are already present.
       std::vector<std::pair<std::string, int>> elements;
       for (int i = 0; i < size; ++i) {
         elements.emplace_back(keyOf(i), 100 + i);

@@ -11,7 +11,7 @@ const QZUnit& QZUnit::unitWithSymbol(std::string_view symbol) {
     std::mutex mutex;
     std::map<std::string, std::unique_ptr<const QZUnit>, std::less<>> bySymbol;
   };
-  static auto* const units = new Units;  // never released: measurements may outlive the main function
+  static auto* const units = new Units;  // never destroyed: measurements may outlive the main function
   const std::lock_guard lock(units->mutex);
   auto found = units->bySymbol.find(symbol);
   if (found == units->bySymbol.end()) {

@@ -40,7 +40,7 @@ namespace {
 template <class Integer>
 Integer truncated(double number) {
   if (std::isnan(number)) return 0;
-  // The limits as doubles: the lower one is exact, the upper one may round up to the first number out of range.
+  // The limits as doubles: the lower one is exact, the upper one may be rounded up and out of range.
   constexpr auto lowest = static_cast<double>(std::numeric_limits<Integer>::min());
   constexpr auto highest = static_cast<double>(std::numeric_limits<Integer>::max());
   if (number <= lowest) return std::numeric_limits<Integer>::min();

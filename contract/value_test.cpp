@@ -28,7 +28,7 @@ static_assert(!std::is_constructible_v<Value, int*>);
 static_assert(!std::is_constructible_v<Value, const void*>);
 static_assert(!std::is_constructible_v<Value, long double>);
 static_assert(!std::is_constructible_v<Value>);
-// The small integer types that are no characters do convert.
+// Small integer types other than characters are accepted.
 static_assert(std::is_convertible_v<signed char, Value>);
 static_assert(std::is_convertible_v<unsigned char, Value>);
 

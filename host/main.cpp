@@ -16,7 +16,7 @@
 
 namespace {
 
-// Colour is for people at a terminal that can show it, unless they asked for none (https://no-color.org).
+// Colour requires a terminal that supports it, and a user who has not disabled it (https://no-color.org).
 bool wantsColour() {
   const char* const noColour = std::getenv("NO_COLOR");
   if (noColour != nullptr && *noColour != '\0') return false;
@@ -24,10 +24,10 @@ bool wantsColour() {
   return isatty(STDOUT_FILENO) == 1 && terminal != nullptr && std::string_view(terminal) != "dumb";
 }
 
-// True when text goes out as UTF-8, by the locale of the environment. The program's own locale stays what it is.
+// True if the locale of the environment uses UTF-8. Does not change the program's own locale.
 bool writesUtf8() {
   const locale_t locale = newlocale(LC_CTYPE_MASK, "", nullptr);
-  if (locale == nullptr) return false;  // the environment names a locale that is not installed
+  if (locale == nullptr) return false;  // that locale is not installed
   const bool utf8 = std::string_view(nl_langinfo_l(CODESET, locale)) == "UTF-8";
   freelocale(locale);
   return utf8;

@@ -1,12 +1,12 @@
-# The Debian packages that `cpack` makes of a build, one for each component of the installation.
-# A build that is configured for any prefix will do: packages install under /usr.
+# The Debian packages that `cpack` creates from a build, one per component of the installation. The build may be
+# configured for any prefix: packages install to /usr.
 set(CPACK_GENERATOR DEB)
 set(CPACK_PACKAGE_DESCRIPTION_SUMMARY "")  # each package has its own
 set(CPACK_PACKAGE_CONTACT "Quazor maintainers <maintainers@quazor.invalid>" CACHE STRING
     "Who the packages name as their maintainer")
 set(CPACK_PACKAGING_INSTALL_PREFIX /usr)
 set(CPACK_STRIP_FILES ON)
-# Whatever the umask of who makes the packages.
+# Independent of the umask of the user who creates the packages.
 set(CPACK_INSTALL_DEFAULT_DIRECTORY_PERMISSIONS
     OWNER_READ OWNER_WRITE OWNER_EXECUTE GROUP_READ GROUP_EXECUTE WORLD_READ WORLD_EXECUTE)
 
@@ -14,15 +14,15 @@ set(CPACK_COMPONENTS_ALL program plugins development)
 set(CPACK_DEB_COMPONENT_INSTALL ON)
 set(CPACK_DEBIAN_FILE_NAME DEB-DEFAULT)
 set(CPACK_DEBIAN_PACKAGE_CONTROL_STRICT_PERMISSION ON)
-# What a program or plug-in is linked with is what its package depends on; libquazor comes from this build.
+# Dependencies follow from the linked libraries; libquazor comes from this build.
 set(CPACK_DEBIAN_PACKAGE_SHLIBDEPS ON)
 set(CPACK_DEBIAN_PACKAGE_SHLIBDEPS_PRIVATE_DIRS ${CMAKE_LIBRARY_OUTPUT_DIRECTORY})
-# All three are of one version: another one may have another contract.
+# The three packages must have the same version, because another version may have another contract.
 set(CPACK_DEBIAN_ENABLE_COMPONENT_DEPENDS ON)
 set(CPACK_COMPONENT_PLUGINS_DEPENDS program)
 set(CPACK_COMPONENT_DEVELOPMENT_DEPENDS program)
 
-# So that packages of other people's plug-ins depend on this version too.
+# Makes packages of other plug-ins depend on this version too.
 get_target_property(so_version quazor SOVERSION)
 file(CONFIGURE OUTPUT shlibs CONTENT "libquazor @so_version@ quazor (= @PROJECT_VERSION@)\n" @ONLY)
 file(CONFIGURE OUTPUT triggers CONTENT "activate-noawait ldconfig\n")

@@ -7,14 +7,14 @@ namespace QUAZOR_CONTRACT {
 namespace {
 
 Platform& currentPlatform() {
-  // Never released: experiments that outlive the main function may still use its services.
+  // Never destroyed: experiments that outlive the main function may still use its services.
   static auto* const platform = new Platform;
   return *platform;
 }
 
 }  // namespace
 
-// Of the services that have nothing else to define: their tables of virtual functions are in this library alone.
+// Defines the destructors out of line, so that the virtual tables exist only in this library.
 
 CaptureObject::~CaptureObject() = default;
 CaptureStream::~CaptureStream() = default;

@@ -10,7 +10,7 @@
 namespace quazor {
 namespace {
 
-// Implementations without any hardware, each as a host would write it against the interface alone.
+// Implementations without hardware that use only the interfaces, as a host would write them.
 
 template <class Interface>
 class Propertyless : public Interface {

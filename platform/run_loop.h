@@ -25,8 +25,8 @@ using RunLoopActivities = std::uint32_t;
 inline constexpr RunLoopActivities kRunLoopEntry = 0x01;          // a run has begun
 inline constexpr RunLoopActivities kRunLoopBeforeSources = 0x04;  // sources are signalled and about to be handled
 inline constexpr RunLoopActivities kRunLoopBeforeWaiting = 0x20;  // nothing to do: the thread is about to sleep
-inline constexpr RunLoopActivities kRunLoopAfterWaiting = 0x40;   // the thread was woken, or the time limit came
-inline constexpr RunLoopActivities kRunLoopExit = 0x80;           // the run is over; the last thing it tells
+inline constexpr RunLoopActivities kRunLoopAfterWaiting = 0x40;   // the thread was woken, or the time limit expired
+inline constexpr RunLoopActivities kRunLoopExit = 0x80;           // the run is over; the last notification
 inline constexpr RunLoopActivities kRunLoopAllActivities = 0x0FFFFFFF;
 
 // The reason why a run ended. If several apply, the first in this list is returned.
@@ -38,7 +38,7 @@ enum class RunLoopResult {
 };
 
 // A source of events. Created by a loop, which keeps it alive while it is added.
-// Thread: any for signal(); the rest is its loop's.
+// Thread: any for signal(); its loop's for the rest.
 class QUAZOR_EXPORT RunLoopSource {
  public:
   RunLoopSource() = default;
@@ -63,7 +63,7 @@ class QUAZOR_EXPORT RunLoopObserver {
 
 // The loop of one thread.
 //
-// Thread: its own, but for stop() and RunLoopSource::signal(), which any thread may call while the loop lives.
+// Thread: its own, except stop() and RunLoopSource::signal(), which any thread may call while the loop lives.
 // Handlers: called on the loop's thread, in the loop's run, never before a call that adds them has returned. They may
 //   call everything here, add and remove themselves or others, and run the loop again. A removed handler is no longer
 //   called; one that removes itself stays alive until it has returned. A handler that is added takes effect with the
@@ -94,8 +94,8 @@ class QUAZOR_EXPORT RunLoop {
 
   // Runs until the time limit expires, stop() is called, the mode has no sources left or, if requested, a source was
   // handled. Sources that are already signalled are handled once even if the limit is zero or negative; a limit beyond
-  // the clock's range never expires. Every run begins with kRunLoopEntry and ends with kRunLoopExit, also when there is
-  // nothing to wait for. While there is nothing to do the thread sleeps. Runs may be within runs, in any mode.
+  // the clock's range never expires. Every run begins with kRunLoopEntry and ends with kRunLoopExit, even if there is
+  // nothing to wait for. The thread sleeps while there is nothing to do. Runs may be nested, in any mode.
   virtual RunLoopResult runInMode(std::string_view mode, std::chrono::nanoseconds limit,
                                   bool returnAfterSourceHandled) = 0;
   // Ends the innermost active run as soon as the current handler has returned and all sources of that round are

@@ -28,7 +28,7 @@ struct Counts {
   int alive() const { return constructions - destructions; }
 };
 
-// A callable of a given size that keeps account of itself.
+// A callable of a given size that counts its constructions, calls and destructions.
 template <std::size_t kSize, bool kMovesWithoutThrowing = true>
 class Counted {
  public:
@@ -150,7 +150,7 @@ TEST(EmptyTaskTest, HoldsNothingAndMovesAsNothing) {
 }
 
 TEST(TaskOwnershipTest, ACallableThatOwnsItsTaskMayDropIt) {
-  // The queue's case: the last reference to an owner goes in the destruction of its own task.
+  // As in a queue: destroying the task releases the last reference to its own owner.
   auto task = std::make_shared<Task>();
   const std::weak_ptr<Task> watch = task;
   *task = Task([task] {});

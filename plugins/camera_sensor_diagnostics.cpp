@@ -1,4 +1,4 @@
-// The catalogue: what this plug-in registers with the host's lab when it is loaded.
+// The registry of this plug-in: the names that it registers with the host's lab when it is loaded.
 //
 // The names are public and permanent; their order is the order in which hosts list them.
 #include "contract/lab.h"

@@ -1,4 +1,4 @@
-// What loading the plug-in registers, from outside: the shared object as it is shipped.
+// The registrations of the plug-in, loaded as the shipped shared object.
 #include "backends/simulated/scenario/scenario.h"
 #include "backends/simulated/simulated_phone.h"
 #include "contract/lab.h"
@@ -55,7 +55,7 @@ const struct Row {
 
 class Catalogue : public ::testing::Test {
  protected:
-  // The plug-in registers in this process's lab, once, and stays loaded.
+  // Loads the plug-in, which registers once with this process's lab and stays loaded.
   static void SetUpTestSuite() {
     registeredBefore = QZLab::defaultLab().registrations().size();
     ASSERT_NE(dlopen(QUAZOR_PLUGIN, RTLD_NOW | RTLD_LOCAL), nullptr) << dlerror();
@@ -63,7 +63,7 @@ class Catalogue : public ::testing::Test {
     installPlatform(std::move(platform));
   }
 
-  // Runs a camera experiment and returns what it set, as "object KEY = value", for one property.
+  // Runs a camera experiment and returns its changes of one property as "OBJECT KEY = VALUE".
   static std::vector<std::string> settingsOf(std::string_view experiment, std::string_view property) {
     SimulatedPhone phone(shippedScenario("healthy"), PhoneTime::kVirtual, 0);
     std::vector<std::string> settings;
@@ -126,7 +126,7 @@ TEST_F(Catalogue, GivesEveryExperimentAndAnalysisOfAGroupTheSamePorts) {
     const auto analysis = lab.find(Kind::kAnalysis, "CameraSyncAnalysis" + suffix)->makeAnalysis();
     const auto judged = analysis->analyzeExperimentResult(*result, nullptr);
     ASSERT_NE(judged, nullptr);
-    EXPECT_EQ(judged->measuredResults().size(), group == "Back" ? 9U : 6U);  // three of each camera
+    EXPECT_EQ(judged->measuredResults().size(), group == "Back" ? 9U : 6U);  // three per camera
     installPlatform(before);
   }
 }

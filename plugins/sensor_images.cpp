@@ -1,4 +1,4 @@
-// What this plug-in registers with the host's lab when it is loaded. The name is public and permanent.
+// The registration of this plug-in with the host's lab. The name is public and permanent.
 #include "contract/lab.h"
 #include "diagnostics/sensor_images/nimbe_image_experiment.h"
 

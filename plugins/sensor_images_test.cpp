@@ -1,4 +1,4 @@
-// What loading the plug-in registers.
+// The registration of the plug-in.
 #include "contract/lab.h"
 #include "tests/support/hand_made_sensor.h"
 
@@ -13,7 +13,7 @@ namespace {
 TEST(SensorImagesPlugin, RegistersItsOneExperiment) {
   const QZLab& lab = QZLab::defaultLab();
   ASSERT_TRUE(lab.registrations().empty());
-  // Stays loaded: the lab keeps its factory.
+  // Stays loaded, because the lab keeps its factory.
   ASSERT_NE(dlopen(SENSOR_IMAGES_PLUGIN, RTLD_NOW | RTLD_LOCAL), nullptr) << dlerror();
   ASSERT_EQ(lab.registrations().size(), 1U);
   EXPECT_TRUE(lab.refusedNames().empty());

@@ -1,5 +1,5 @@
 #!/usr/bin/env python3
-"""Runs ./check in small repositories, with stand-ins for the tools that it calls.
+"""Runs ./check in small repositories, with fake versions of the tools that it calls.
 
     check_test.py CHECK
 
@@ -16,7 +16,7 @@ import unittest
 
 CHECK = None
 RULES = ("include_directions", "every_test_is_built", "folders", "thread_words")
-# Each is a shell script; they refuse what holds the word WRONG.
+# Shell scripts; they fail if a file contains the word WRONG.
 TOOLS = {
     "clang-format": 'shift 2; ! grep -H WRONG "$@"',
     "clang-tidy": "exit 0",

@@ -1,6 +1,6 @@
-"""Completion as a shell's user meets it: through bash and its script, and through what zsh's script asks for.
+"""Completion through bash and its script, and the candidates that zsh's script requests.
 
-CTest gives the program in the environment.
+CTest passes the program in the environment.
 """
 
 import os
@@ -29,7 +29,7 @@ class CompletionTest(unittest.TestCase):
         self.environment = dict(os.environ, PATH=f"{pathlib.Path(PROGRAM).parent}:{os.environ['PATH']}")
 
     def complete(self, *words):
-        """What bash offers for the last word."""
+        """The candidates that bash offers for the last word."""
         self.script.write_text(subprocess.run([PROGRAM, "completion", "bash"], capture_output=True, text=True,
                                               check=True).stdout)
         result = subprocess.run(["bash", "-c", BASH, "bash", str(self.script), "quazor", *words], capture_output=True,

@@ -1,11 +1,11 @@
 #!/usr/bin/env python3
-"""Checks that a run whose program is killed leaves a record of everything that the user has seen, and no process.
+"""Checks that killing the program leaves a record of everything that the user has seen, and no process.
 
     killed_host_test.py PROGRAM PLUGINS
 
-PLUGINS is the directory with the plug-ins of misbehaving/. PROGRAM is killed (SIGKILL) at moments that are chosen by a
-seed: while it loads and describes plug-ins, while log lines flood, while a process sleeps and between two diagnostics.
-With QUAZOR_THOROUGH=1 in the environment there are 200 kills, otherwise 20; with QUAZOR_SEED, others.
+PLUGINS is the directory with the plug-ins of misbehaving/. PROGRAM is killed (SIGKILL) at random times:
+while it loads and describes plug-ins, while log lines flood, while a process sleeps and between two diagnostics.
+With QUAZOR_THOROUGH=1 in the environment there are 200 kills, otherwise 20; QUAZOR_SEED changes the times.
 """
 
 import collections
@@ -28,10 +28,10 @@ from report_readers import printable
 
 KILLS = 200 if os.environ.get("QUAZOR_THOROUGH") == "1" else 20
 SEED = int(os.environ.get("QUAZOR_SEED", "1"))
-LONGEST_DEATH = 5.0  # seconds on an idle machine, until a child has noticed that its parent is gone
-KILLS_PER_LENGTH = 5  # with so many kills the length of a run is measured again: what else the machine does changes it
-COUNT = 2000  # of log lines, of measurements and of results
-# What is run, in this order: quiet and loud ones, and one that never ends.
+LONGEST_DEATH = 5.0  # seconds on an idle machine until a child notices the end of its parent
+KILLS_PER_LENGTH = 5  # the length of a run is measured again after so many kills, as the load changes
+COUNT = 2000  # of log lines, measurements and results
+# The diagnostics in order: quiet and loud ones, and one that never ends.
 NAMES = ("CrashInRun", "LogFlood", "WellBehaved", "ManyMeasurements", "GarbageToOutput", "ForkIntoHost", "ManyResults",
          "CrashInAnalysis", "CloseConnection", "Abort", "HangInRun")
 LOG_LINE = re.compile(r"(?:\d{4}-\d\d-\d\d )?\S+ (error|default|debug) quazor: (.*)")
@@ -39,13 +39,13 @@ VERDICTS = {"PASS": "pass", "FAIL": "fail", "ERROR": "error"}
 
 
 def whole_lines(file):
-    """The lines of a file that have an end."""
+    """The complete lines of a file."""
     content = file.read_bytes() if file.exists() else b""
     return content.decode("utf-8", errors="surrogateescape").split("\n")[:-1]
 
 
 def shown_verdicts(lines):
-    """The names and verdicts of a text report: a name stands alone at the beginning of a line, its verdict below."""
+    """The names and verdicts in a text report: a name begins a line, and its verdict is below it."""
     name, shown = None, []
     for line in lines:
         if line and not line.startswith(" "):
@@ -66,7 +66,7 @@ def recorded_verdicts(events):
 
 
 class Killed:
-    """A run of the program that was killed, and what it left in the directory. `wait` returns when it is to be."""
+    """A run of the program that was killed, and the files that it left. `wait` returns at the time of the kill."""
 
     def __init__(self, directory, wait):
         self.record = directory / "record.jsonl"
@@ -94,7 +94,7 @@ class Killed:
 
     @property
     def moment(self):
-        """What the program was doing, by the record's last whole line."""
+        """The activity of the program according to the last complete line of the record."""
         if not self.events:
             return "before the first event"
         last = self.events[-1]["event"]
@@ -110,7 +110,7 @@ class KilledHostTest(unittest.TestCase):
         for number in range(KILLS):
             if number % KILLS_PER_LENGTH == 0:
                 longest = self.length_of_run()
-            # The first tenth of a run, in which the plug-ins are loaded, has its own part of the kills.
+            # The first tenth of a run, in which the plug-ins are loaded, gets its own share of the kills.
             seconds = chance.uniform(0, longest * (0.1 if number % 10 == 0 else 1.05))
             with self.subTest(number=number, seconds=seconds), tempfile.TemporaryDirectory() as directory:
                 killed = Killed(pathlib.Path(directory), functools.partial(time.sleep, seconds))
@@ -125,7 +125,7 @@ class KilledHostTest(unittest.TestCase):
         self.assertGreater(tally["(log lines seen)"], KILLS)
 
     def length_of_run(self):
-        """The seconds until the one that never ends runs."""
+        """The time in seconds until the diagnostic that never ends runs."""
         with tempfile.TemporaryDirectory() as directory:
             record = pathlib.Path(directory) / "record.jsonl"
             begin = time.monotonic()
@@ -146,7 +146,7 @@ class KilledHostTest(unittest.TestCase):
         recorded = collections.Counter((one["level"], printable(one["text"])) for one in logged)
         seen = collections.Counter((level, text) for level, text in killed.log if r"\x" not in text)
         self.assertEqual(seen - recorded, collections.Counter(), "lines were seen that are not in the record")
-        if not killed.events:  # it was killed before it could have shown anything
+        if not killed.events:  # killed before it could have shown anything
             self.assertEqual((killed.verdicts, killed.log), ([], []))
             return
         done = subprocess.run([PROGRAM, "verify", str(killed.record)], stdout=subprocess.PIPE,

@@ -1,15 +1,15 @@
 #!/usr/bin/env python3
-"""Checks that a plug-in that misbehaves harms nothing but its own diagnostic.
+"""Checks that a misbehaving plug-in affects only its own diagnostic.
 
     misbehaving_test.py PROGRAM PLUGINS --sanitizers=SANITIZERS
 
-PLUGINS is the directory with the plug-ins of misbehaving/. Each case runs one diagnostic, and after it a well-behaved
-one, in one call of PROGRAM. The first must end as its case says, within its deadline; the second must pass, in
-surroundings that are as always; what came before the end must be in the record; the record must be verified; and no
-process may be left. SANITIZERS, which may be empty, are those that the program was built with; a limit of memory
-cannot work with them, so the cases that need one are skipped.
+PLUGINS is the directory with the plug-ins of misbehaving/. Each case runs one diagnostic and then a well-behaved
+one in the same call of PROGRAM. The first must end as its case specifies, within its deadline; the second must pass
+in an unchanged environment; the record must contain everything up to the end and must pass verification; and no
+process may be left. SANITIZERS, which may be empty, lists the sanitizers of the program's build; memory limits do
+not work with them, so the cases that need one are skipped.
 
-With QUAZOR_THOROUGH=1 in the environment, floods are of a million, as otherwise of less.
+With QUAZOR_THOROUGH=1 in the environment floods have a million items, otherwise fewer.
 """
 
 import concurrent.futures
@@ -33,27 +33,27 @@ EXCEPTION, NOTHING_MEASURED, CANNOT_BE_JUDGED, CRASHED, EXITED, DEADLINE, CONNEC
 WELL_BEHAVED = "WellBehaved"
 LATER_CRASH = "crashAfterTheFirstTime_on_load"  # the plug-in can be loaded once
 STAGES = ("load", "describe", "setup", "run", "teardown", "analyze")
-LIMIT = 1  # seconds, of a stage that hangs
-GRACE = 0.5  # seconds, from the polite request to end to the other
-MARGIN = 3.0  # seconds, on an idle machine; it grows with what the machine has else to do
+LIMIT = 1  # seconds, for a stage that hangs
+GRACE = 0.5  # seconds between SIGTERM and SIGKILL
+MARGIN = 3.0  # seconds on an idle machine; multiplied by the slowdown of a busy one
 MEMORY = 256  # mebibytes
 MANY = 1_000_000 if os.environ.get("QUAZOR_THOROUGH") == "1" else 5_000
 
 
 @dataclass
 class Case:
-    """What a diagnostic must come to. `stage` is the one whose end is bad."""
+    """The expected outcome of a diagnostic. `stage` is the one that ends badly."""
 
     name: str
-    code: int = 0  # of the host's error; 0: the diagnostic passes
-    message: str = ""  # the error's message holds it
+    code: int = 0  # code of the host's error; 0: the diagnostic passes
+    message: str = ""  # the error's message contains this
     stage: str = "run"
-    log: tuple = ()  # lines that the record holds, beside the first
+    log: tuple = ()  # lines that the record contains in addition to the first one
     plugins: tuple = ("misbehaving",)
     shell: str = 'exec "$@"'  # runs the program
-    hangs: bool = False  # it is ended at the deadline
-    grace: bool = False  # and does not heed the polite request
-    floods: bool = False  # it takes the time that a machine needs for much of something
+    hangs: bool = False  # it exceeds the deadline
+    grace: bool = False  # and ignores SIGTERM
+    floods: bool = False  # it needs extra time for a large amount of something
     needs_memory_limit: bool = False
     check: object = None  # takes the case's Outcome and a TestCase
     count: int = 0  # the value of the diagnostic's parameter of that name, if it has one
@@ -61,17 +61,17 @@ class Case:
 
 @dataclass
 class Outcome:
-    """What a call of the program has come to."""
+    """The outcome of a call of the program."""
 
     code: int
     out: str
     err: str
     seconds: float
-    slowdown: float  # of this machine meanwhile
+    slowdown: float  # of this machine during the call
     events: list  # of the record
-    size: int  # of the record, in octets
+    size: int  # of the record, in bytes
     verified: subprocess.CompletedProcess
-    left: list  # the numbers of processes
+    left: list  # the IDs of remaining processes
 
     def about(self, name):
         """The events of a diagnostic."""
@@ -103,7 +103,7 @@ def lose_connection(name, **more):
 
 
 def of_result(name, code, message):
-    """The analysis' result is no good."""
+    """The result of the analysis is unusable."""
     return Case(name, code, message, stage="analyze")
 
 
@@ -123,7 +123,7 @@ def texts(outcome, name, event, key):
 def dropped_lines(outcome, test):
     lines = [str(text) for text in texts(outcome, "FloodOfLines", "log", "text")]
     test.assertEqual(sum(line.startswith("output: as many lines") for line in lines), 10_000)
-    count = 100 * -(-1_000_000 // 47)  # the flood is of a hundred blocks of whole lines
+    count = 100 * -(-1_000_000 // 47)  # a flood of a hundred blocks of complete lines
     test.assertIn(f"{count - 10_000} more lines of output were dropped", lines)
 
 
@@ -149,7 +149,7 @@ def all_results(outcome, test):
 
 
 def one_set_of_events(outcome, test):
-    """A copy of the process has told nothing."""
+    """Checks that a copy of the process reported nothing."""
     test.assertNotIn("the copy logs", texts(outcome, "ForkIntoHost", "log", "text"))
     begun = texts(outcome, "ForkIntoHost", "stageBegan", "stage")
     test.assertEqual(begun, [stage for stage in STAGES if stage in begun])
@@ -265,13 +265,13 @@ def events_in(file):
 
 
 def run(names, plugins, options=(), shell='exec "$@"'):
-    """Runs the diagnostics, in one call of the program."""
+    """Runs the diagnostics in one call of the program."""
     with tempfile.TemporaryDirectory() as directory:
         record = pathlib.Path(directory) / "record.jsonl"
         command = ["sh", "-c", shell, "sh", PROGRAM, "run", *names, *options, "--record", str(record)]
         for plugin in plugins:
             command += ["--plugin", str(PLUGINS / f"{plugin}.so")]
-        # The sanitizers must let crashes happen.
+        # The sanitizers must not intercept crashes.
         sanitizers = "handle_segv=0:handle_abort=0:die_after_fork=0"
         environment = environment_with_marker(
             XDG_STATE_HOME=directory, MISBEHAVIOUR_STATE=os.path.join(directory, "state"),
@@ -424,7 +424,7 @@ class MisbehavingTest(unittest.TestCase):
 
 
 def add_tests():
-    """A test for each case. Some run at once, as most of them sleep, and each test waits for its own."""
+    """One test per case. Several cases run at once because most of them sleep; each test waits for its own."""
     pool = concurrent.futures.ThreadPoolExecutor(3)
     for number, case in enumerate(CASES):
         if case.needs_memory_limit and SANITIZERS:

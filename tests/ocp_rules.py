@@ -1,5 +1,5 @@
-"""Lines of Open Compute Test & Validation, version 2.0, read back and held to the rules of the format that are beyond
-the form of a single line, and to what this project promises beside."""
+"""Parses lines of Open Compute Test & Validation, version 2.0, and checks the rules that concern more than one line and
+the additional guarantees of this project."""
 
 import json
 import re
@@ -24,8 +24,8 @@ class Stream:
         self.start = None
         self.end = None
         self.of_run = []  # (key, content)
-        self.steps = {}  # by identifier: the contents, in order, without start and end
-        self.status_of_step = {}  # None: not ended
+        self.steps = {}  # by ID: the contents in order, without start and end
+        self.status_of_step = {}  # by ID; None: not ended
 
     def of_step(self, step):
         return self.steps.get(step, [])
@@ -60,7 +60,7 @@ def measurement_problems(measurement):
 
 
 def verdict_problems(step):
-    """Each diagnosis stands behind its measurement, and says what its validators say."""
+    """Checks that each diagnosis follows its measurement and agrees with its validators."""
     measurement = None
     for one in step:
         if "diagnosis" in one and one["diagnosis"]["type"] != "UNKNOWN":
@@ -72,7 +72,7 @@ def verdict_problems(step):
 
 
 def end_problems(stream):
-    """What does not go with how the run ended."""
+    """Checks that the contents agree with the end of the run."""
     pair = (stream.end["status"], stream.end["result"])
     if pair not in PAIRS:
         yield f"the pair {pair}"
@@ -125,7 +125,7 @@ def add_to_step(stream, artifact):
 
 
 def add(stream, line, number):
-    """Adds a line to a stream; what is wrong with it, as sentences."""
+    """Adds a line to a stream; returns the violations as sentences."""
     if stream.end is not None:
         yield "a line behind testRunEnd"
     if line.pop("sequenceNumber") != number:
@@ -149,7 +149,7 @@ def add(stream, line, number):
 
 
 def streams_of(content, where, found):
-    """The test runs of a file. What is against the rules is added to `found`, as sentences that begin with `where`."""
+    """The test runs of a file. Adds violations to `found`, as sentences that begin with `where`."""
     streams = []
     number = 0
     lines = content.decode("utf-8").split("\n")

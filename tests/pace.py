@@ -1,4 +1,4 @@
-"""How fast this machine is just now, for the limits of tests that run beside other work."""
+"""The current speed of this machine, to adjust the limits of tests that run beside other work."""
 
 import time
 
@@ -6,7 +6,7 @@ WORK = 0.03  # seconds of processor time
 
 
 def slowdown():
-    """How many times longer work takes now than on an idle machine, at least 1: a short piece of it is timed."""
+    """How many times longer work takes now than on an idle machine, at least 1. Times a short piece of work."""
     begin, used_before = time.monotonic(), time.thread_time()
     while time.thread_time() - used_before < WORK:
         pass

@@ -1,6 +1,6 @@
-"""Reads the records of a run back from the forms of its report, each with a parser of its own.
+"""Parses the report formats back into records, with an independent parser per format.
 
-What a form can say of a record is a dictionary; `expected_of_FORM` makes it from that of the JSON document.
+The information that a format contains is a dictionary; `expected_of_FORM` derives it from that of the JSON document.
 """
 
 import collections
@@ -21,18 +21,18 @@ NO_LIMIT = Limit("", None, None)
 
 
 def number(text):
-    """A number as something that compares, whatever its form: NaN equals itself, and zeros keep their sign."""
+    """A number in comparable form, independent of its notation: NaN equals itself, and zeros keep their sign."""
     return repr(float(text))
 
 
 def printable(text):
-    """As people are shown it: a control character is \\xNN."""
+    """Escapes control characters as \\xNN, as in user-readable text."""
     return re.sub("[\x00-\x1f\x7f-\x9f]", lambda found: f"\\x{ord(found[0]):02x}", text)
 
 
 def blurred(value):
-    """The value with each stretch that is not UTF-8 as one U+FFFD, in all its texts: JSON has such signs where people
-    are shown the bytes as \\xNN, one that looks like a control character among them."""
+    """Replaces each run of U+FFFD or of escaped bytes \\xNN, in all texts of the value, with one U+FFFD: JSON has the
+    former where user-readable text has the latter."""
     if isinstance(value, str):
         return re.sub(r"(?:\ufffd|\\x[89a-f][0-9a-f])+", "\ufffd", value)
     if isinstance(value, dict):
@@ -45,12 +45,12 @@ def blurred(value):
 
 
 def in_xml(text):
-    """As XML 1.0 can hold it."""
+    """Replaces the characters that XML 1.0 does not allow."""
     return re.sub("[\x00-\x08\x0b\x0c\x0e-\x1f\ufffe\uffff]", "\ufffd", text)
 
 
 def errors_of(error):
-    """An error of the JSON document and those that caused it, the nearest first."""
+    """An error of the JSON document and its underlying errors, the nearest first."""
     errors = []
     while error is not None:
         errors.append(Error(error["domain"], error["code"], error["message"]))
@@ -58,7 +58,7 @@ def errors_of(error):
     return errors
 
 
-# --- JSON: what the others are compared with ---
+# --- JSON: the reference for the other formats ---
 
 
 def limit_of(limit):
@@ -119,7 +119,7 @@ def ocp_limit(measurement):
 
 
 def ocp_results(stream):
-    """The results of the analysis, whose diagnoses stand behind their measurements."""
+    """The results of the analysis; each diagnosis follows its measurement."""
     results = []
     for one in stream.of_step("analysis"):
         if "measurement" in one:
@@ -134,7 +134,7 @@ def ocp_results(stream):
 
 
 def read_ocp(stream):
-    """A test run as a record."""
+    """Converts a test run to a record."""
     levels = {"ERROR": "error", "INFO": "default", "DEBUG": "debug"}
     raw = [one["measurement"] for one in stream.of_step("experiment") if "measurement" in one]
     extensions = {one["extension"]["name"]: one["extension"]["content"]
@@ -162,7 +162,7 @@ def read_ocp(stream):
 
 
 def expected_of_ocp(record):
-    """With an error, nothing is known of the hardware."""
+    """After an error the state of the hardware is unknown."""
     if record["verdict"] != "error":
         return record
     unknown = [one if one.verdict == "none" else one._replace(verdict="unknown") for one in record["results"]]
@@ -178,7 +178,7 @@ def properties_of(element):
 
 
 def derived_verdict(suite):
-    """What a server of continuous integration makes of a suite."""
+    """The outcome of a suite as a continuous integration server shows it."""
     counts = {key: int(suite.get(key)) for key in ("tests", "failures", "errors", "skipped")}
     cases = suite.findall("testcase")
     real = {"tests": len(cases), "failures": sum(one.find("failure") is not None for one in cases),
@@ -204,7 +204,7 @@ def junit_result(case, verdict_of_suite):
     allowed = {"pass": [[]], "none": [[]], "fail": [["failure"], ["error"]]}[result.verdict]
     if result.verdict == "fail" and not all(math.isfinite(float(it[key])) for key in ("value", "lower", "upper")
                                             if key in it):
-        allowed = [["error"]]  # it cannot be judged
+        allowed = [["error"]]  # the result cannot be judged
     found = [one.tag for one in case if one.tag != "properties"]
     if found not in allowed or (found == ["error"] and verdict_of_suite != "error"):
         raise ValueError(f"{result} with {found}")
@@ -251,7 +251,7 @@ def read_junit(suite):
 
 
 def error_lines(errors, indent):
-    """The errors as people are shown them."""
+    """The errors as user-readable text."""
     return [indent + ("caused by " if place else "") + printable(f"{one.domain} code {one.code}: {one.message}")
             for place, one in enumerate(errors)]
 
@@ -284,7 +284,7 @@ def csv_rows(content):
 
 
 def read_csv(rows):
-    """A diagnostic's lines as a record."""
+    """Converts a diagnostic's lines to a record."""
     if any(row[:2] != rows[0][:2] or row[11:] != rows[0][11:] for row in rows):
         raise ValueError("lines of one diagnostic differ in what they say of it")
     first = dict(zip(CSV_HEADER, rows[0]))
@@ -303,7 +303,7 @@ def read_csv(rows):
 
 
 def expected_of_csv(record):
-    """No limit looks like one without name and bounds, and there is room for one error."""
+    """No limit looks like a limit without name and bounds, and there is only one error."""
     results = [one._replace(limit=one.limit or NO_LIMIT) for one in record["results"]]
     return {"name": record["name"], "verdict": record["verdict"], "results": results, "errors": record["errors"][:1]}
 
@@ -321,8 +321,8 @@ def read_experiment_csv(rows):
 
 
 def columns_of(line, begins):
-    """The cells of a line of a table, as bytes. Bytes that only continue a code point have no width; a blank stands
-    before every cell, so those at a cell's beginning are its own."""
+    """The cells of a table line, as bytes. Bytes that continue a code point have no width. A blank precedes every cell,
+    so blanks at the beginning of a cell belong to it."""
     begins_of_points = [at for at, byte in enumerate(line) if byte & 0xC0 != 0x80]
     cuts = [begins_of_points[begin - 1] + 1 for begin in begins]
     return [line[begin:end] for begin, end in zip(cuts, cuts[1:] + [len(line)])]
@@ -333,7 +333,7 @@ def readable(cell):
 
 
 def table_of(lines):
-    """The rows of a table whose second column is a number on the right."""
+    """The rows of a table whose second column is a right-aligned number."""
     header = lines[0].decode()
     begins = [header.index(word) for word in ("Unit", "Limit", "Verdict") if word in header]
     rows = []
@@ -345,7 +345,7 @@ def table_of(lines):
 
 
 def text_limit(text):
-    """The limit of such a text, and its name."""
+    """Parses a limit and its name."""
     if text == "-":
         return None
     one = r"(-?[0-9.e+-]+|-?inf|nan)"
@@ -357,7 +357,7 @@ def text_limit(text):
 
 
 class Lines:
-    """The lines of a text, read one after the other."""
+    """Reads the lines of a text one by one."""
 
     def __init__(self, content):
         self.lines = content.split(b"\n")
@@ -368,7 +368,7 @@ class Lines:
         return self.lines[self.at - 1]
 
     def block(self):
-        """The lines up to an empty one, which is passed."""
+        """The lines up to an empty one, which is skipped."""
         begin = self.at
         while self.next():
             pass
@@ -379,7 +379,7 @@ class Lines:
 
 
 def read_text(lines, expected):
-    """The next record of a text."""
+    """The next record in a text."""
     record = {"name": lines.next().decode("utf-8", "replace")}
     record["summary"] = [line.decode("utf-8", "replace") for line in lines.block()]
     record["results"], record["measurements"] = [], []

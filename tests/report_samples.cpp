@@ -1,9 +1,9 @@
-// Makes random runs and writes each of them in every form of report, for a reader to compare.
+// Generates random runs and writes each of them in every report format, for a reader to compare.
 //
 //   report_samples DIRECTORY COUNT SEED
 //
-// The directory gets a file for each format, with its name. In it each run is a line with the number of its bytes, and
-// then the report.
+// Writes one file per format, named after it, to the directory. In it each run is preceded by a line with the length of
+// its report in bytes.
 #include "host/error/host_error.h"
 #include "host/model/judge.h"
 #include "host/report/report_format.h"
@@ -134,7 +134,7 @@ class Generator {
   }
 
  private:
-  // 0 to `most`.
+  // A random number from 0 to `most`.
   std::size_t upTo(std::size_t most) { return static_cast<std::size_t>(random_() % (most + 1)); }
   bool oneIn(std::size_t count) { return upTo(count - 1) == 0; }
   template <class T, std::size_t size>
@@ -148,9 +148,9 @@ class Generator {
     return text;
   }
 
-  // Some time later; or right now, as the wall clock may be coarse.
+  // A later time, or the same one, because the wall clock may be coarse.
   Date advance() { return now_ += std::chrono::nanoseconds(oneIn(4) ? 0 : upTo(2'000'000'000)); }
-  // Somewhat before now: log lines of several threads, and a clock that was set back.
+  // A slightly earlier time: log lines of several threads, or a clock that was set back.
   Date around() { return now_ - std::chrono::nanoseconds(oneIn(4) ? upTo(3'000'000'000) : 0); }
 
   double number() { return oneIn(3) ? static_cast<double>(upTo(1000)) / 8 : oneOf(kNumbers); }
@@ -180,14 +180,14 @@ class Generator {
     return parameters;
   }
 
-  // Not the same as that of another number, whatever a report makes of the bytes.
+  // Different for every number, even after a report has replaced invalid bytes.
   std::string distinct(std::size_t number) { return std::to_string(number) + text(); }
 
   std::shared_ptr<const QZBound> bound(double value, const QZUnit& unit, bool open) {
     return std::make_shared<const QZBound>(Measurement(value, unit), open);
   }
 
-  // A result that passes, fails, is for information or, if `wild`, cannot be judged.
+  // A result that passes, fails, is informational or, if `wild`, cannot be judged.
   QZMeasuredResult result(bool wild, bool mayFail) {
     const QZUnit& ofValue = unit();
     const double value = wild && oneIn(3) ? oneOf(kNotFinite) : number();
@@ -218,7 +218,7 @@ class Generator {
     if (ends) record.stages.back().end = advance();
   }
 
-  // Goes through the stages up to one that fails, if one does. True when the analysis is to follow.
+  // Performs the stages up to one that fails, if any. Returns true if the analysis follows.
   bool goThrough(DiagnosticRecord& record) {
     std::optional<Stage> failing;
     if (oneIn(3)) failing = oneOf(kStages);
@@ -294,7 +294,7 @@ class Generator {
     if (!sample.interrupted->empty()) sample.run.names.push_back(*sample.interrupted);
     for (std::size_t i = upTo(2); i > 0; --i) sample.run.names.push_back(text());
     if (!oneIn(3)) return;
-    // It was asked to end, and there is a record of it.
+    // The run was interrupted during a diagnostic that has a record.
     DiagnosticRecord record = begun();
     record.experimentOnly = sample.run.ofExperiments;
     addStage(record, Stage::kRun, false);

@@ -1,11 +1,11 @@
 #!/usr/bin/env python3
-"""Reads random runs back from every form of report, each with a parser of its own, and compares what they say.
+"""Reads random runs back from every report format, each with its own parser, and compares the contents.
 
 usage: reports_agree.py REPORT_SAMPLES
 
-REPORT_SAMPLES is the program that makes the runs. The lines of Open Compute Test & Validation must also obey the rules
-of their format. With QUAZOR_THOROUGH=1 in the environment there are ten times as many runs. Exit code 0: all agree;
-1: something does not, or a kind of run was not among the samples.
+REPORT_SAMPLES is the program that generates the runs. The lines of Open Compute Test & Validation must also obey the
+rules of their format. With QUAZOR_THOROUGH=1 in the environment there are ten times as many runs. Exit code 0: all
+formats agree; 1: they do not, or a kind of run was missing from the samples.
 """
 
 import collections
@@ -26,8 +26,8 @@ SEED = 20261121
 SHOWN = 20
 FORMS = ("text", "json", "csv", "ocp", "junit")
 INTERRUPTION = report_readers.Error("QuazorHostErrorDomain", 11, "it was interrupted")
-SIGNS = ("]]>", "\ufffd", "\uffff", "\\u0000", "\\r", "\u2028", ",")  # as JSON has them
-# There must be some of each.
+SIGNS = ("]]>", "\ufffd", "\uffff", "\\u0000", "\\r", "\u2028", ",")  # as in JSON
+# The samples must contain some of each.
 KINDS = {"a diagnostic: pass", "a diagnostic: fail", "a diagnostic: error", "an experiment: pass",
          "an experiment: error", "an interrupted run without a record", "an interrupted run with a record", "a run that never began",
          "no results", "many results", "a deep error", "a value that is not finite", "a limit without bounds",
@@ -44,7 +44,7 @@ def counts_line(records, of_experiments):
 
 
 def text_end(records, of_experiments, interrupted):
-    """The lines behind the records of a text."""
+    """The lines after the records of a text."""
     if len(records) != 1 or interrupted is not None:
         yield counts_line(records, of_experiments)
     if interrupted:
@@ -52,7 +52,7 @@ def text_end(records, of_experiments, interrupted):
 
 
 class Comparison:
-    """What the forms of the reports say differently, and which kinds of runs there were."""
+    """The differences between the report formats, and the kinds of runs that occurred."""
 
     def __init__(self):
         self.found = []
@@ -63,7 +63,7 @@ class Comparison:
             self.found.append(f"{where}: got {got!r:.600}, expected {expected!r:.600}")
 
     def check_record(self, where, got, expected):
-        """`got` is compared as far as `expected` goes too."""
+        """Compares the keys of `got` that `expected` has too."""
         for key in got.keys() & expected.keys():
             self.check(f"{where}: {key}", got[key], expected[key])
 
@@ -77,7 +77,7 @@ class Comparison:
         self.check(f"{name} junit: time", abs(difference) <= 0.001 * len(suites), True)
 
     def compare(self, name, reports):
-        """`reports` are the bytes of one run's, by format."""
+        """`reports` contains the reports of one run by format, as bytes."""
         of_experiments, records, interrupted = report_readers.read_json(reports["json"].decode("utf-8"))
         self.count_kinds(of_experiments, records)
         streams = ocp_rules.streams_of(reports["ocp"], f"{name} ocp", self.found)
@@ -150,7 +150,7 @@ class Comparison:
 
 
 def reports_in(file):
-    """The reports of one format, a run's after the other."""
+    """The reports of one format, one per run."""
     content = file.read_bytes()
     at = 0
     while at < len(content):

@@ -1,12 +1,12 @@
 #!/usr/bin/env python3
-"""Runs diagnostics and experiments on every scenario that the project ships and compares the outcome with what the
-scenario expects.
+"""Runs diagnostics and experiments on every shipped scenario and compares the outcome with the scenario's
+expectation.
 
 usage: scenarios_test.py PROGRAM SCENARIOS PLUGIN
 
 PLUGIN registers the experiments that scenarios name. Every scenario must obey the schema and expect an outcome of each
-diagnostic and experiment that it is about, and each of its faults must have fired: a run whose fault never fired shows
-nothing. Exit code 0: all is as expected; 1: something is not.
+diagnostic and experiment that it concerns, and each of its faults must have fired, because a run whose fault never
+fired shows nothing. Exit code 0: everything is as expected; 1: it is not.
 """
 
 import concurrent.futures
@@ -35,22 +35,22 @@ def merge_patch(target, patch):
 
 
 def read(file):
-    """The scenario with the files that it is based on."""
+    """The scenario, merged with the files that it is based on."""
     content = json.loads(file.read_text(encoding="utf-8"))
     base = content.pop("base", None)
     return content if base is None else merge_patch(read(file.parent / base), content)
 
 
 def error_of(error):
-    """The parts of an error that a scenario can expect."""
+    """The members of an error that a scenario can expect."""
     return None if error is None else {key: error[key] for key in ("domain", "code", "message")}
 
 
 def differences(expected, outcome):
-    """What the outcome of a diagnostic or an experiment has that the scenario did not expect, as sentences."""
+    """The differences between an outcome and the scenario's expectation, as sentences."""
     error = outcome["error"]
     if error is not None and error["domain"] == HOST_DOMAIN and "error" not in expected:
-        error = None  # the host's own words for a run that gave none
+        error = None  # the host's own error for a run that reported none
     pairs = {
         "verdict": (expected["verdict"], outcome["verdict"]),
         "error": (expected.get("error"), error_of(error)),
@@ -67,8 +67,8 @@ def differences(expected, outcome):
 
 
 def compare(command, expectations, fired):
-    """Runs the program, whose outcomes `expectations` describe by name, and adds to `fired` how often each fault did.
-    What is not as expected, as sentences."""
+    """Runs the program for the outcomes that `expectations` describes by name and adds the counts of its faults to
+    `fired`. Returns the differences as sentences."""
     run = subprocess.run(
         [*command, "--format", "json"],
         stdout=subprocess.PIPE, stderr=subprocess.PIPE, text=True, timeout=300, check=False)
@@ -89,7 +89,7 @@ def compare(command, expectations, fired):
 
 
 def problems(program, plugin, file):
-    """Runs what a scenario is about; what is not as expected, as sentences."""
+    """Runs everything that a scenario expects; returns the differences as sentences."""
     expectations = read(file).get("expect", {})
     if not expectations:
         return ["it expects nothing"]

@@ -1,4 +1,4 @@
-// The example plug-in, on a clock that wakes its sleepers as the test says.
+// The example plug-in, with a clock whose lateness the tests set.
 #include "contract/lab.h"
 #include "contract/message_format.h"
 #include "platform/platform.h"
@@ -19,7 +19,7 @@ namespace {
 using namespace std::chrono_literals;
 using Kind = QZLab::Kind;
 
-// A sleep takes `lateness` longer than it should.
+// Every sleep takes `lateness` longer than requested.
 class ClockWithLateness final : public Clock {
  public:
   explicit ClockWithLateness(std::chrono::nanoseconds lateness) : lateness_(lateness) {}
@@ -35,7 +35,7 @@ class ClockWithLateness final : public Clock {
 
 class SleepAccuracy : public ::testing::Test {
  protected:
-  // The plug-in registers in this process's lab, once, and stays loaded.
+  // Loads the plug-in, which registers once with this process's lab and stays loaded.
   static void SetUpTestSuite() {
     ASSERT_NE(dlopen(SLEEP_ACCURACY_PLUGIN, RTLD_NOW | RTLD_LOCAL), nullptr) << dlerror();
     ASSERT_TRUE(QZLab::defaultLab().refusedNames().empty());
@@ -52,7 +52,7 @@ class SleepAccuracy : public ::testing::Test {
     return experiment;
   }
 
-  // The text of the error of a setup with this value, or nothing when it succeeds.
+  // The error of a setup with this value as text, or nothing if it succeeds.
   static std::optional<std::string> refusalOf(const Dictionary& parameters) {
     DiagnosticErrorPtr error;
     if (makeExperiment(0s)->setupWithParameters(parameters, nullptr, &error)) return std::nullopt;

@@ -3,8 +3,8 @@
 
     under_comma_locale.py TEST_PROGRAM
 
-Machines often have no such locale, so it is compiled for the run, with localedef from Debian's package locales.
-Exits with 77, which CTest shows as a skipped test, when that is not possible.
+Machines often lack such a locale, so it is compiled for the run with localedef from Debian's package locales.
+Exits with 77, which CTest shows as a skipped test, if that is not possible.
 """
 
 import os

@@ -1,4 +1,4 @@
-// CameraSettings: what a stream's properties are set to.
+// CameraSettings: the property values of a stream.
 #pragma once
 
 #include "contract/value.h"
@@ -11,7 +11,8 @@
 
 namespace quazor {
 
-// As they were set, so that they read back as the kind of number they were. Every user who takes control of a stream
+// Values are stored with the numeric type with which they were set. A user who takes control of a stream gets new
+// settings.
 // begins with new ones.
 //
 // Thread: one at a time.
@@ -27,9 +28,9 @@ struct CameraSettings {
   Value outputsEnabled{Dictionary{}};
   Value outputHandlers{Dictionary{}};
 
-  // The InfraredLightSourceConfiguration that lets nothing fire.
+  // The InfraredLightSourceConfiguration with all light sources off.
   static Value darkness();
-  // The handlers of the primary output; null when it is not enabled or has none.
+  // The handler of the primary output; null if the output is not enabled or has no handler.
   std::shared_ptr<PixelBufferHandler> frameHandler() const {
     return handler<PixelBufferHandler>(capture_key::PixelBufferHandler);
   }

@@ -1,6 +1,6 @@
-// What a backend gives to the capture service that every backend shares (checked_capture.h): the cameras themselves.
+// CaptureBack: the cameras of a backend, for the capture service shared by all backends (checked_capture.h).
 //
-// A back asks nothing about users, control, phases or kinds of values: the front has checked all that before it calls.
+// A back does not check users, control, phases or types of values: the front has checked them before it calls.
 #pragma once
 
 #include "backends/capture/camera_settings.h"
@@ -23,30 +23,30 @@ namespace quazor {
 // A camera's part in a session.
 struct SessionCount {
   std::int64_t offset = 0;      // frames of the master before the camera's first
-  std::int64_t frameCount = 0;  // frames that came since; -1 when none did
+  std::int64_t frameCount = 0;  // frames since then; -1 if there are none
 
   friend bool operator==(const SessionCount&, const SessionCount&) = default;
 };
 
-// What never changes about a camera.
+// The constant properties of a camera.
 struct CameraInfo {
-  std::string name;         // in messages
+  std::string name;         // for messages
   std::string port;         // its port type (platform/capture_keys.h)
   std::string description;  // of its stream
   bool hasProjector = false;
-  bool hasMultipleOutputs = true;          // takes MultipleOutputSupportEnabled
-  bool isSlaveOfAnyConfiguration = false;  // else a slave streams at the master's rate, and skips nothing
+  bool hasMultipleOutputs = true;          // supports MultipleOutputSupportEnabled
+  bool isSlaveOfAnyConfiguration = false;  // false: a slave must stream at the master's rate without skipping
 };
 
 struct CaptureGroupInfo {
-  std::string name;                  // in messages
+  std::string name;                  // for messages
   std::string description;           // of the group
   std::vector<std::size_t> cameras;  // indexes, in the group's order
-  std::size_t master = 0;            // the index of one of them
+  std::size_t master = 0;            // the index of one of the cameras
   bool takesMasterConfiguration = true;
 };
 
-// One stretch of a stream, from its start to its stop. The front keeps the last one, for what it counted.
+// One streaming run, from start to stop. The front keeps the last one for its counts.
 //
 // Thread: any.
 class CaptureRun {
@@ -67,32 +67,32 @@ class CameraBack {
 
   virtual const CameraInfo& info() const = 0;
 
-  // Control of the stream is taken: makes the camera ready. The settings are new; the back may change what the camera
-  // has another way. On failure nothing is left open.
+  // Called when a user takes control of the stream: prepares the camera. The settings are new; the back may change them
+  // to the values that the camera has. On failure nothing may stay open.
   virtual bool open(CameraSettings& settings, DiagnosticErrorPtr* error) = 0;
-  // Control is given back. Called after open(), while the stream does not run.
+  // Called when control is released, after open() and while the stream does not run.
   virtual void close() = 0;
 
-  // The highest format index, and the highest rate of the format that is set; nothing when only the driver can tell.
+  // The highest format index, and the highest rate of the current format; nothing if only the driver knows.
   virtual std::optional<std::uint64_t> maxFormatIndex() const = 0;
   virtual std::optional<double> maxFrameRate(const CameraSettings& settings) const = 0;
 
-  // Does what the settings that are to be say, and is true when they may be kept. REQUIRES, for each: open.
+  // Apply the new settings; they are kept if the result is true. REQUIRES, for each: open.
   virtual bool applyFormat(const CameraSettings& wanted, DiagnosticErrorPtr* error) = 0;
   virtual bool applyRates(const CameraSettings& wanted, DiagnosticErrorPtr* error) = 0;
   virtual bool applyAutoExposure(const CameraSettings& wanted, DiagnosticErrorPtr* error) = 0;
-  // The light comes with the stream's start; here it is only checked whether it can.
+  // Only checks the light source configuration; the light is switched on when the stream starts.
   virtual bool checkLightSource(const CameraSettings& wanted, DiagnosticErrorPtr* error) = 0;
 
-  // ErrorCounters; `run` is the present stretch or the last one, or null.
+  // ErrorCounters. `run` is the current or the last streaming run, or null.
   virtual std::optional<Dictionary> errorCounters(const CaptureRun* run, DiagnosticErrorPtr* error) const = 0;
-  // The camera's part in the session of `master`; nothing when the status leaves the camera out. `run` as above.
+  // The camera's part in the session of `master`; nothing if the status omits the camera. `run` as above.
   virtual std::optional<SessionCount> sessionCount(const CaptureRun* run, const CaptureRun& master) const = 0;
 };
 
 // The streams of one user.
 //
-// Thread: any. start() comes with the service's mutex held; what waits for handlers comes without.
+// Thread: any. start() is called with the service's mutex held; functions that wait for handlers are called without it.
 class StreamingBack {
  public:
   StreamingBack() = default;
@@ -100,12 +100,12 @@ class StreamingBack {
   StreamingBack& operator=(const StreamingBack&) = delete;
   virtual ~StreamingBack();
 
-  // The stretch, which has begun; null, and an error, on failure. REQUIRES: the camera is open.
+  // Returns the started run; null and an error on failure. REQUIRES: the camera is open.
   virtual std::shared_ptr<CaptureRun> start(CameraBack& camera, const CameraSettings& settings,
                                             DiagnosticErrorPtr* error) = 0;
-  // When it returns no handler runs, but one that is on this very thread, or will run. May be called more than once.
+  // After it returns, no handler runs, except on the calling thread, or will run. May be called more than once.
   virtual void quiesce(CaptureRun& run) = 0;
-  // Ends the stretch, once, after quiesce(). False, with the first error, when not all went as it should.
+  // Ends the run. Called once, after quiesce(). Returns false with the first error if a step fails.
   virtual bool end(CaptureRun& run, DiagnosticErrorPtr* error) = 0;
 };
 
@@ -125,31 +125,31 @@ class CaptureBack {
   CaptureBack& operator=(const CaptureBack&) = delete;
   virtual ~CaptureBack();
 
-  // The same at every call.
+  // Returns the same cameras in every call.
   virtual std::vector<std::shared_ptr<CameraBack>> cameras() const = 0;
   virtual std::vector<CaptureGroupInfo> groups() const = 0;
   virtual std::unique_ptr<StreamingBack> makeStreaming() const = 0;
 
   virtual bool plugInLoads() const { return true; }
-  // Why there is no capture device; empty when there is one.
+  // Why there is no capture device; empty if there is one.
   virtual std::string missingDevice() const { return {}; }
-  // Cameras are about to be opened, several perhaps.
+  // Called before one or several cameras are opened.
   virtual void prepareToOpen() {}
 
-  // Stores the backend's own error for the refusal. REQUIRES: `error` is not null.
+  // Stores the backend's error for the refusal. REQUIRES: `error` is not null.
   virtual void storeRefusal(DiagnosticErrorPtr* error, CaptureRefusal reason, std::string message) const = 0;
   // Makes the call: `body` is true when it has succeeded. A backend may look on, or make the call fail.
   virtual void perform(const CaptureCall& call, DiagnosticErrorPtr* error, const std::function<bool()>& body) const;
 };
 
-// The caller's place for an error, and whose error comes there.
+// The caller's error variable and the backend whose errors are stored in it.
 //
 // Thread: one at a time.
 class Refuser {
  public:
   Refuser(const CaptureBack& back, DiagnosticErrorPtr* error) : back_(back), error_(error) {}
 
-  // Stores the refusal where the caller gave a place for one, and is false.
+  // Stores the refusal unless the caller passed null, and returns false.
   template <class... Arguments>
   bool operator()(CaptureRefusal reason, MessageFormat<Arguments...> format, const Arguments&... arguments) const {
     if (error_ != nullptr) back_.storeRefusal(error_, reason, formatMessage<Arguments...>(format, arguments...));

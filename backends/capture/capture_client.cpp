@@ -105,7 +105,7 @@ bool CaptureClient::start(std::size_t index, DiagnosticErrorPtr* error) {
 bool CaptureClient::begin(CameraSlot& camera, const Refuser& refuse) {
   if (!checkControl(camera, refuse)) return false;
   if (camera.phase != StreamPhase::kStopped) {
-    return refuse(CaptureRefusal::kWrongState, "%@ is running already.", camera.info().name);
+    return refuse(CaptureRefusal::kWrongState, "%@ is already running.", camera.info().name);
   }
   if (!checkRates(camera, refuse)) return false;
   std::shared_ptr<CaptureRun> run = streaming_->start(*camera.back, camera.settings, refuse.error());
@@ -133,7 +133,7 @@ bool CaptureClient::stop(std::size_t index, DiagnosticErrorPtr* error) {
   return stopped;
 }
 
-// Ends what this call has set to kStopping: nobody else changes the camera's phase or stretch meanwhile.
+// Ends what this call has set to kStopping: no other call changes the camera's phase or run in the meantime.
 bool CaptureClient::end(CameraSlot& camera, DiagnosticErrorPtr* error) {
   streaming_->quiesce(*camera.run);
   const bool ended = streaming_->end(*camera.run, error);
@@ -155,7 +155,8 @@ bool CaptureClient::invalidate(DiagnosticErrorPtr* error) {
 
 bool CaptureClient::release(DiagnosticErrorPtr* error) {
   std::vector<CameraSlot*> running;
-  std::vector<std::shared_ptr<CaptureRun>> stopping;  // who stops it frees the camera, whose next run is another
+  // The call that stops a run also frees the camera, which may then get another run.
+  std::vector<std::shared_ptr<CaptureRun>> stopping;
   {
     const HeldSlots held(*slots_);
     for (CameraSlot& camera : slots_->cameras) {
@@ -173,8 +174,8 @@ bool CaptureClient::release(DiagnosticErrorPtr* error) {
       }
     }
   }
-  // One that a handler stops is done when the handler is; one that is stopped on another thread waits for this one,
-  // which then is the handler's.
+  // A stop by a handler is completed after the handler has returned. If another thread stops the same run, it waits for
+  // this handler.
   for (const std::shared_ptr<CaptureRun>& run : stopping) streaming_->quiesce(*run);
   bool succeeded = true;
   for (CameraSlot* camera : running) {

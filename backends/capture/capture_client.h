@@ -1,4 +1,4 @@
-// What the capture objects share: the cameras, and one user of them.
+// CaptureClient: one user of the cameras, and the state that all users share.
 #pragma once
 
 #include "backends/capture/capture_back.h"
@@ -16,57 +16,57 @@
 
 namespace quazor {
 
-// One user of the cameras: each device that a plug-in hands out. 0 is nobody.
+// A user of the cameras: each device that a plug-in returns is one. 0 is nobody.
 using CaptureClientId = std::uint64_t;
 
 enum class StreamPhase { kStopped, kRunning, kStopping };
 
-// A camera as the service has it.
+// The service's state of a camera.
 struct CameraSlot {
   std::shared_ptr<CameraBack> back;
   CameraSettings settings;
   CaptureClientId holder = 0;
   StreamPhase phase = StreamPhase::kStopped;
-  bool freedByStop = false;         // the holder left while it was being stopped: the call that stops it frees it
-  std::shared_ptr<CaptureRun> run;  // the present stretch, or else the last one of the session
+  bool freedByStop = false;         // the holder left during a stop: the call that stops the stream frees the camera
+  std::shared_ptr<CaptureRun> run;  // the current run, or else the last one of the session
 
   const CameraInfo& info() const { return back->info(); }
 };
 
 struct CaptureGroupSlot {
   CaptureGroupInfo info;
-  std::vector<std::size_t> active;  // what ActiveStreams was set to
+  std::vector<std::size_t> active;  // the value of ActiveStreams
   Value masterConfiguration{Dictionary{}};
 };
 
-// All users of the service share it.
+// Shared by all users of the service.
 //
-// Thread: any, holding `mutex`; what is const needs no lock.
+// Thread: any, holding `mutex`; const members need no lock.
 struct CaptureSlots {
   explicit CaptureSlots(std::shared_ptr<CaptureBack> cameras);
 
-  // Closes the camera and makes it nobody's.
+  // Closes the camera and frees it.
   void release(CameraSlot& camera);
-  // MulticamSessionStatus: an entry for every active stream of the configured groups; nothing when no session of
-  // theirs has begun.
+  // MulticamSessionStatus: an entry for every active stream of the configured groups; nothing if none of their sessions
+  // has started.
   std::optional<Dictionary> sessionStatus() const;
 
   const std::shared_ptr<CaptureBack> back;
   std::mutex mutex;
   std::vector<CameraSlot> cameras;
   std::vector<CaptureGroupSlot> groups;
-  std::vector<std::size_t> configuredGroups;  // what MultiCamConfiguration was set to
+  std::vector<std::size_t> configuredGroups;  // the value of MultiCamConfiguration
   CaptureClientId lastClient = 0;
-  // Values of properties that nobody uses any more. With a handler goes what its maker put into it, perhaps a capture
-  // device: HeldSlots destroys them without the mutex.
+  // Values of properties that are no longer used. A handler may own other objects, even a capture device, so HeldSlots
+  // destroys the values without the mutex.
   std::vector<Value> dropped;
 };
 
-// No stream of the group runs; `object` names whose property `key` is.
+// True if no stream of the group runs. `object` is the owner of the property `key`.
 bool checkStopped(std::string_view object, std::string_view key, const CaptureSlots& slots,
                   const CaptureGroupSlot& group, const Refuser& refuse);
 
-// Holds the mutex while it lives.
+// Holds the mutex during its lifetime.
 //
 // Thread: one at a time.
 class HeldSlots final {
@@ -81,8 +81,8 @@ class HeldSlots final {
   std::unique_lock<std::mutex> lock_;
 };
 
-// One user of the cameras. A device, its groups and its streams share it; when the last of them is gone, the user's
-// streams stop and others may have them.
+// One user of the cameras, shared by a device, its groups and its streams. When the last of them is destroyed, the
+// user's streams stop and control is released.
 //
 // Thread: any.
 class CaptureClient final {
@@ -108,14 +108,15 @@ class CaptureClient final {
     return result;
   }
 
-  // For bodies of perform(). True when this user has control of the camera; else an error that says who has.
+  // For the bodies of perform(). True if this user has control of the camera; otherwise stores an error that names the
+  // user who has.
   bool checkControl(const CameraSlot& camera, const Refuser& refuse) const;
 
-  // What follows takes the mutex itself, as it waits for handlers.
+  // The functions below lock the mutex themselves, because they wait for handlers.
   bool start(std::size_t camera, DiagnosticErrorPtr* error);
   bool stop(std::size_t camera, DiagnosticErrorPtr* error);
-  // Stops and gives back what the user has, and refuses every call from now on. False, with the first error, when a
-  // stream could not be stopped as it should.
+  // Stops the streams, releases control and refuses all later calls. Returns false with the first error if a stop
+  // fails.
   bool invalidate(DiagnosticErrorPtr* error);
 
  private:

@@ -1,17 +1,17 @@
-// What the capture service of every backend has to do, as a typed test suite.
+// Requirements on the capture service of every backend, as a typed test suite.
 //
 // A backend instantiates it with a type that has a default constructor and the members
 //
 //   std::shared_ptr<CaptureService> service();
 //   std::shared_ptr<CaptureService> serviceWithoutDevice();
 //   std::string refusal(CaptureRefusal);      // "DOMAIN CODE" of that refusal
-//   void pass(std::chrono::milliseconds);     // lets time go by, so that frames come
+//   void pass(std::chrono::milliseconds);     // lets time pass, so that frames arrive
 //
 //   INSTANTIATE_TYPED_TEST_SUITE_P(Linux, CaptureConformance, LinuxUnderTest);
 //
-// The device has four streams: BackFacingCamera, BackFacingTelephotoCamera and BackFacingSuperWideCamera, which are one
+// The device has four streams: BackFacingCamera, BackFacingTelephotoCamera and BackFacingSuperWideCamera, which form a
 // group with the first as its master, and FrontFacingInfraredCamera, which has a projector. Each has the formats 0 and
-// 1, takes 30 frames per second and exposes automatically or not, as it is told.
+// 1, supports 30 frames per second, and can switch automatic exposure on and off.
 #pragma once
 
 #include "backends/capture/capture_user_for_tests.h"
@@ -313,7 +313,7 @@ struct BadSetting {
   CaptureRefusal reason;
 };
 
-// What no camera's stream takes.
+// Invalid settings for any camera's stream.
 inline std::vector<BadSetting> badStreamSettings() {
   using enum CaptureRefusal;
   const auto in = [](std::string_view key, Value value) {
@@ -379,7 +379,7 @@ inline std::vector<BadSetting> badStreamSettings() {
   return rows;
 }
 
-// What no slave's configuration may be.
+// Invalid slave configurations.
 inline std::vector<BadSetting> badSlaves() {
   using enum CaptureRefusal;
   constexpr std::string_view kKey = capture_key::SynchronizedStreamsSlaveConfiguration;

@@ -1,5 +1,5 @@
-// What every capture service has to do with streams that run, with groups and with sessions, as a typed test suite: the
-// second half of capture_conformance.h, and instantiated like it.
+// Requirements on running streams, groups and sessions of every capture service, as a typed test suite: the second part
+// of capture_conformance.h, instantiated in the same way.
 #pragma once
 
 #include "backends/capture/capture_conformance.h"
@@ -189,14 +189,14 @@ TYPED_TEST_P(CaptureSessionConformance, NothingIsSynchronizedWhileAStreamOfTheGr
   const CaptureUser& user = this->user_;
   ASSERT_EQ(user.request(user.streams), "done");
   ASSERT_EQ(user.set(user.back(), capture_key::ActiveStreams, Array{user.streams[0]}), "done");
-  ASSERT_EQ(user.start(1), "done");  // it is of the group and not active
+  ASSERT_EQ(user.start(1), "done");  // in the group, but not active
   const std::string refused = this->no(CaptureRefusal::kWrongState);
   EXPECT_EQ(user.set(user.back(), capture_key::ActiveStreams, Array{}), refused);
   EXPECT_EQ(user.set(user.back(), capture_key::MasterConfiguration, Dictionary{}), refused);
   EXPECT_EQ(user.set(*user.device, capture_key::MultiCamConfiguration, capture_sample::session({user.groups[0]})),
             refused);
   ASSERT_EQ(user.stop(1), "done");
-  ASSERT_EQ(user.start(3), "done");  // it is of no group
+  ASSERT_EQ(user.start(3), "done");  // not in the group
   EXPECT_EQ(user.set(user.back(), capture_key::ActiveStreams, Array{user.streams[0]}), "done");
   EXPECT_EQ(user.stop(3), "done");
 }

@@ -1,4 +1,4 @@
-// A user of a capture service, and values that he sets, for the suites that every backend runs.
+// A user of a capture service and values to set, for the suites that every backend runs.
 #pragma once
 
 #include "backends/capture/capture_refusal.h"
@@ -22,7 +22,7 @@
 
 namespace quazor {
 
-// Keys and values as the suite's tables have them.
+// Keys and values for the tables of the suites.
 namespace capture_sample {
 
 inline std::string text(std::string_view key) { return std::string(key); }
@@ -45,7 +45,7 @@ inline Dictionary light(Value mode, Value pattern, Value current) {
           {text(capture_key::StructuredLightCurrent), std::move(current)}};
 }
 
-// A configuration that any slave takes.
+// A configuration that is valid for any slave.
 inline Dictionary slave() {
   return {{text(capture_key::StreamingOutputsEnabled), true},
           {text(capture_key::FrameSkippingEnabled), false},
@@ -77,7 +77,7 @@ inline Dictionary handlers(Value frames) {
 
 }  // namespace capture_sample
 
-// What a call that takes an error out-argument ended in: "done", or "DOMAIN CODE" of its error.
+// The result of a call with an error out-argument: "done", or "DOMAIN CODE" of its error.
 template <class Call>
 std::string endOf(Call&& call) {
   DiagnosticErrorPtr error;
@@ -115,13 +115,13 @@ struct CaptureUser {
   static std::string read(CaptureObject& object, std::string_view key) {
     return endOf([&](auto* error) { return object.valueForProperty(key, error); });
   }
-  // Takes control of the streams of the back and makes them a session.
+  // Takes control of the back cameras' streams and creates a session for them.
   void synchronize() const {
     ASSERT_EQ(request(backStreams()), "done");
     ASSERT_EQ(set(back(), capture_key::ActiveStreams, capture_sample::arrayOf(backStreams())), "done");
     ASSERT_EQ(set(*device, capture_key::MultiCamConfiguration, capture_sample::session({groups[0]})), "done");
   }
-  // An entry of the session's status, "OFFSET FRAMES"; empty when there is none.
+  // An entry of the session's status, "OFFSET FRAMES"; empty if there is none.
   std::string status(std::string_view port) const {
     const auto all = device->valueForProperty(capture_key::MulticamSessionStatus, nullptr);
     const Value* const one = entryOf(pointerTo(all), port);
@@ -135,7 +135,7 @@ struct CaptureUser {
   SynchronizedStreamsGroups groups;
 };
 
-// What both suites need; capture_conformance.h says what UnderTest has to have.
+// The common part of both suites; capture_conformance.h describes UnderTest.
 template <class UnderTest>
 class CaptureFixture : public ::testing::Test {
  protected:

@@ -85,17 +85,17 @@ class ClientDevice final : public CaptureDevice {
   bool checkGroup(const CaptureGroupSlot& group, const Refuser& refuse) const;
 
   const std::shared_ptr<CaptureClient> client_;
-  ClientStreams streams_;                             // by the camera's index
-  std::vector<std::shared_ptr<ClientGroup>> groups_;  // by the group's index
+  ClientStreams streams_;                             // by index of the camera
+  std::vector<std::shared_ptr<ClientGroup>> groups_;  // by index of the group
 };
 
-// Null, and the refusal told, when it is no stream of this device.
+// Returns null and stores the refusal if it is not a stream of this device.
 CameraSlot* ClientDevice::cameraOf(const std::shared_ptr<CaptureStream>& stream, const Refuser& refuse) const {
   const auto own = std::dynamic_pointer_cast<ClientStream>(stream);
   if (own != nullptr && std::ranges::find(streams_, own) != streams_.end()) {
     return &client_->slots().cameras[own->index()];
   }
-  refuse(CaptureRefusal::kForeignObject, "%@ is no stream of this device.", stream);
+  refuse(CaptureRefusal::kForeignObject, "%@ is not a stream of this device.", stream);
   return nullptr;
 }
 
@@ -110,7 +110,7 @@ bool ClientDevice::acquireAll(const CaptureStreams& streams, const Refuser& refu
   if (!wanted.empty()) slots.back->prepareToOpen();
   std::vector<CameraSlot*> opened;
   for (CameraSlot* camera : wanted) {
-    if (camera->holder == client_->id()) continue;  // it is in the list twice
+    if (camera->holder == client_->id()) continue;  // the list contains it twice
     CameraSettings settings;
     if (!camera->back->open(settings, refuse.error())) {
       for (CameraSlot* one : opened) slots.release(*one);
@@ -129,7 +129,8 @@ bool ClientDevice::releaseAll(const CaptureStreams& streams, const Refuser& refu
     CameraSlot* const camera = cameraOf(stream, refuse);
     if (camera == nullptr || !client_->checkControl(*camera, refuse)) return false;
     if (camera->phase != StreamPhase::kStopped) {
-      return refuse(CaptureRefusal::kWrongState, "%@ is running; stop it before giving it back.", camera->info().name);
+      return refuse(CaptureRefusal::kWrongState, "%@ is running; stop it before releasing control.",
+                    camera->info().name);
     }
     if (std::ranges::find(given, camera) == given.end()) given.push_back(camera);
   }
@@ -160,7 +161,7 @@ bool ClientDevice::set(const Value& value, std::string_view key, const Refuser& 
   for (const std::size_t index : groups) {
     if (!checkGroup(slots.groups[index], refuse)) return false;
   }
-  for (const std::size_t index : groups) {  // a new session: what was streamed before is not part of it
+  for (const std::size_t index : groups) {  // a new session, which does not include earlier runs
     for (const std::size_t camera : slots.groups[index].info.cameras) slots.cameras[camera].run.reset();
   }
   slots.configuredGroups = std::move(groups);
@@ -171,18 +172,18 @@ bool ClientDevice::readGroups(const Value& value, std::vector<std::size_t>& grou
   constexpr std::string_view kGroups = capture_key::ActiveSynchronizedStreamsGroups;
   const Value* const list = entryOf(&value, kGroups);
   if (list == nullptr || list->array() == nullptr || value.dictionary()->size() != 1) {
-    return refuse(CaptureRefusal::kWrongType, "%@: %@ must be a dictionary with the one entry %@, an array.",
+    return refuse(CaptureRefusal::kWrongType, "%@: %@ must be a dictionary with exactly one entry, %@, an array.",
                   kDeviceName, capture_key::MultiCamConfiguration, kGroups);
   }
   for (const Value& element : *list->array()) {
     const auto group = std::dynamic_pointer_cast<ClientGroup>(element.object());
     if (group == nullptr || std::ranges::find(groups_, group) == groups_.end()) {
-      return refuse(CaptureRefusal::kForeignObject, "%@: %@ must hold groups of this device, not %@.", kDeviceName,
+      return refuse(CaptureRefusal::kForeignObject, "%@: %@ must contain groups of this device, not %@.", kDeviceName,
                     kGroups, described(element));
     }
     if (std::ranges::find(groups, group->index()) != groups.end()) {
-      return refuse(CaptureRefusal::kOutOfRange, "%@: %@ must hold a group once, not %@ twice.", kDeviceName, kGroups,
-                    group);
+      return refuse(CaptureRefusal::kOutOfRange, "%@: %@ must contain a group once, not %@ twice.", kDeviceName,
+                    kGroups, group);
     }
     groups.push_back(group->index());
   }

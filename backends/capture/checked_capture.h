@@ -1,4 +1,4 @@
-// The capture service of every backend: who may do what when, with which values. What a camera then does is the back's.
+// The capture service of every backend: checks who may do what and when, and all values. The back operates the cameras.
 #pragma once
 
 #include "backends/capture/capture_back.h"
@@ -8,9 +8,9 @@
 
 namespace quazor {
 
-// Each device that its plug-ins hand out is a user of its own of the same cameras. A device's streams and groups are
-// made with it and are the same objects on every path that leads to them. What a user controls is free again when its
-// device, groups and streams are gone.
+// Each device returned by its plug-ins is a separate user of the same cameras. A device's streams and groups are
+// created with it, and every path to them leads to the same objects. When a user's device, groups and streams are
+// destroyed, its control is released.
 //
 // Thread: any.
 std::shared_ptr<CaptureService> makeCheckedCapture(std::shared_ptr<CaptureBack> back);

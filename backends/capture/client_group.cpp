@@ -64,14 +64,16 @@ bool ClientGroup::setActiveStreams(const Value& value, const Refuser& refuse) {
   for (const Value& element : *value.array()) {
     const auto stream = std::dynamic_pointer_cast<ClientStream>(element.object());
     if (stream == nullptr) {
-      return refuse(CaptureRefusal::kWrongType, "%@: %@ must hold streams, not %@.", name(), kKey, described(element));
+      return refuse(CaptureRefusal::kWrongType, "%@: %@ must contain streams, not %@.", name(), kKey,
+                    described(element));
     }
     if (std::ranges::find(streams_, stream) == streams_.end()) {
-      return refuse(CaptureRefusal::kForeignObject, "%@: %@ must hold streams of the group, not %@.", name(), kKey,
+      return refuse(CaptureRefusal::kForeignObject, "%@: %@ must contain streams of the group, not %@.", name(), kKey,
                     stream);
     }
     if (std::ranges::find(active, stream->index()) != active.end()) {
-      return refuse(CaptureRefusal::kOutOfRange, "%@: %@ must hold a stream once, not %@ twice.", name(), kKey, stream);
+      return refuse(CaptureRefusal::kOutOfRange, "%@: %@ must contain a stream once, not %@ twice.", name(), kKey,
+                    stream);
     }
     if (!client_->checkControl(client_->slots().cameras[stream->index()], refuse)) return false;
     active.push_back(stream->index());
@@ -98,7 +100,7 @@ bool ClientGroup::setMasterConfiguration(const Value& value, const Refuser& refu
   }
   const Value* const slaves = value.dictionary()->find(kSlaves);
   if (slaves == nullptr || value.dictionary()->size() != 1) {
-    return refuse(CaptureRefusal::kOutOfRange, "%@: %@ must have the one entry %@.", name(), kKey, kSlaves);
+    return refuse(CaptureRefusal::kOutOfRange, "%@: %@ must have exactly one entry, %@.", name(), kKey, kSlaves);
   }
   if (!checkSlaves(*slaves, refuse)) return false;
   slot().masterConfiguration = value;

@@ -1,4 +1,4 @@
-// ClientGroup: cameras that can be synchronised, as one user has them.
+// ClientGroup: one user's view of cameras that can be synchronised.
 #pragma once
 
 #include "backends/capture/client_stream.h"
@@ -9,13 +9,13 @@
 
 namespace quazor {
 
-// Properties and their types are those of platform/capture_keys.h. Settings need control of the active streams and are
-// refused while a stream of the group runs.
+// Properties and their types are those of platform/capture_keys.h. Setting a property requires control of the active
+// streams, and is refused while a stream of the group runs.
 //
 // Thread: any.
 class ClientGroup final : public SynchronizedStreamsGroup {
  public:
-  // The group at `index`; `streams` are its user's streams of all cameras, by the camera's index.
+  // The group at `index`; `streams` are the user's streams of all cameras, by index of the camera.
   ClientGroup(std::shared_ptr<CaptureClient> client, std::size_t index, const ClientStreams& streams);
 
   std::string description() const override;

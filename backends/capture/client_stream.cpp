@@ -12,7 +12,7 @@ namespace {
 constexpr std::uint64_t kMaxFormatIndex = std::numeric_limits<std::uint32_t>::max();
 constexpr double kMaxRate = 10'000;
 
-// Where the settings keep a property that can be set. A rate that is missing is made.
+// The stored value of a settable property. Adds a missing rate.
 Value& settingOf(CameraSettings& settings, std::string_view key) {
   const std::pair<std::string_view, Value*> kept[] = {
       {capture_key::FormatIndex, &settings.formatIndex},
@@ -80,7 +80,7 @@ std::optional<Value> ClientStream::read(std::string_view key, const Refuser& ref
   return settingOf(camera.settings, key);
 }
 
-// One that was not set is the format's, where that is known.
+// A rate that was not set is that of the format, if known.
 std::optional<Value> ClientStream::readRate(std::string_view key, const std::optional<Value>& rate,
                                             const Refuser& refuse) const {
   if (rate) return rate;

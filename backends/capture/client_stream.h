@@ -1,4 +1,4 @@
-// ClientStream: the stream of one camera, as one user has it.
+// ClientStream: one user's view of a camera's stream.
 #pragma once
 
 #include "backends/capture/capture_client.h"
@@ -11,8 +11,9 @@
 
 namespace quazor {
 
-// Properties and their types are those of platform/capture_keys.h. Settings need control of the stream and are refused
-// while it runs; so is a start with rates that contradict each other or the format, since rates are set one by one.
+// Properties and their types are those of platform/capture_keys.h. Setting a property requires control of the stream
+// and is refused while it runs. A start is refused if the rates contradict each other or the format, because rates are
+// set one by one.
 //
 // Thread: any.
 class ClientStream final : public CaptureStream {

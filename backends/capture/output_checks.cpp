@@ -23,7 +23,7 @@ constexpr std::array kOutputs{capture_key::PrimaryScaler};
 constexpr std::array kOutputSettings{capture_key::AttachRaw};
 constexpr std::array kHandlers{capture_key::PixelBufferHandler, capture_key::EventHandler};
 
-// The value is a dictionary whose entries are among `keys`.
+// True if the value is a dictionary whose keys are all in `keys`.
 bool checkDictionary(std::string_view object, std::string_view key, const Value& value, Keys keys,
                      const Refuser& refuse) {
   const Dictionary* entries = value.dictionary();

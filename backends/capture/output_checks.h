@@ -1,5 +1,5 @@
-// Checks of the properties that rule what a stream delivers and by which light.
-// As in property_checks.h: each is true, or false with the refusal told.
+// Checks of the properties for outputs and light sources. Like those in property_checks.h, each returns true, or stores
+// the refusal and returns false.
 #pragma once
 
 #include "backends/capture/capture_back.h"
@@ -11,14 +11,14 @@ namespace quazor {
 
 // A camera without a projector has no InfraredLightSourceConfiguration.
 bool checkProjector(const CameraInfo& camera, const Refuser& refuse);
-// InfraredLightSourceConfiguration: a dictionary of Mode, StructuredLightPattern and StructuredLightCurrent, integers
-// from 0 to 255, all three and no others. Mode 0 keeps the projector dark.
+// InfraredLightSourceConfiguration: a dictionary of exactly Mode, StructuredLightPattern and StructuredLightCurrent,
+// integers from 0 to 255. Mode 0 keeps the projector off.
 bool checkLightSource(std::string_view object, const Value& value, const Refuser& refuse);
-// VideoOutputConfigurations: by output, a dictionary that may hold AttachRaw, a boolean.
+// VideoOutputConfigurations: for each output, a dictionary that may contain AttachRaw, a boolean.
 bool checkOutputConfigurations(std::string_view object, const Value& value, const Refuser& refuse);
-// VideoOutputsEnabled: by output, a boolean.
+// VideoOutputsEnabled: for each output, a boolean.
 bool checkOutputsEnabled(std::string_view object, const Value& value, const Refuser& refuse);
-// VideoOutputHandlers: by output, a dictionary that may hold a PixelBufferHandler and an EventHandler.
+// VideoOutputHandlers: for each output, a dictionary that may contain a PixelBufferHandler and an EventHandler.
 bool checkOutputHandlers(std::string_view object, const Value& value, const Refuser& refuse);
 
 }  // namespace quazor

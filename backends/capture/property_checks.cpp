@@ -26,7 +26,7 @@ bool isNegative(const Value& value) { return value.signedInteger() != nullptr &&
 constexpr std::array kSlaveSwitches{capture_key::StreamingOutputsEnabled, capture_key::FrameSkippingEnabled,
                                     capture_key::TimeMachineEnabled};
 
-// A camera that only streams along with the master does so at its rate, and skips nothing.
+// Such a camera supports only slave configurations with the master's rate and without skipping.
 bool checkStreamsAlong(std::string_view object, const Dictionary& configuration, const Refuser& refuse) {
   for (const auto& [key, entry] : configuration) {
     const bool isOn = key == capture_key::StreamingOutputsEnabled || key == capture_key::MasterToSlaveFrameRateRatio;

@@ -1,5 +1,5 @@
-// Checks that the capture objects share. Each is true, or false with the refusal told. `object` names the object whose
-// property it is.
+// Checks that the capture objects share. Each returns true, or stores the refusal and returns false. `object` is the
+// name of the property's owner.
 #pragma once
 
 #include "backends/capture/capture_back.h"
@@ -12,24 +12,24 @@
 
 namespace quazor {
 
-// A value as a message tells it: "the number 20", "the string abc", "a dictionary".
+// A value as described in messages: "the number 20", "the string abc", "a dictionary".
 std::string described(const Value& value);
 
-// The object has the property.
+// True if the object has the property.
 bool checkKnown(CaptureObjectKind kind, std::string_view object, std::string_view key, const Refuser& refuse);
-// The object has the property, and it can be set.
+// True if the object has the property and it can be set.
 bool checkWritable(CaptureObjectKind kind, std::string_view object, std::string_view key, const Refuser& refuse);
-// The value is a boolean.
+// True if the value is a boolean.
 bool checkBoolean(std::string_view object, std::string_view key, const Value& value, const Refuser& refuse);
-// The value is an integer, signed or not, of 0 to `highest`.
+// True if the value is a signed or unsigned integer from 0 to `highest`.
 bool checkIndex(std::string_view object, std::string_view key, const Value& value, std::uint64_t highest,
                 const Refuser& refuse);
-// The value is a number above 0 and at most `highest`.
+// True if the value is a number above 0 and at most `highest`.
 bool checkRate(std::string_view object, std::string_view key, const Value& value, double highest,
                const Refuser& refuse);
-// The value is a configuration of a slave: a dictionary of StreamingOutputsEnabled, FrameSkippingEnabled,
-// TimeMachineEnabled (booleans) and MasterToSlaveFrameRateRatio (an integer above 0), all four and no others, and the
-// camera supports it.
+// True if the value is a configuration of a slave that the camera supports: a dictionary of exactly
+// StreamingOutputsEnabled, FrameSkippingEnabled, TimeMachineEnabled (booleans) and MasterToSlaveFrameRateRatio (an
+// integer above 0).
 bool checkSlaveConfiguration(std::string_view object, const CameraInfo& camera, const Value& value,
                              const Refuser& refuse);
 

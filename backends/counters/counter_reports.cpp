@@ -8,12 +8,12 @@ namespace {
 
 using Indexes = std::vector<std::size_t>;
 
-// One answer of FindCounters. Answers differ, also where the backend has the same channels for all.
+// The result of one call of FindCounters. Two results are different, even if the backend finds the same channels.
 struct FoundCounters {
   std::shared_ptr<CounterChannels> channels;
 };
 
-// Channels of one answer, which a set and its snapshots share.
+// Channels from one result, shared by a set and its snapshots.
 struct Selection {
   std::shared_ptr<const FoundCounters> found;
   Indexes indexes;
@@ -32,12 +32,12 @@ Value difference(std::uint64_t later, std::uint64_t earlier) {
 
 class CounterSnapshot final : public ReportSnapshot {
  public:
-  // `count` gives the count of the sample at a position.
+  // `count` returns the count of the sample at a position.
   template <class Count>
   CounterSnapshot(std::shared_ptr<const Selection> selection, Count&& count) : selection_(std::move(selection)) {
     samples_.reserve(selection_->indexes.size());
     for (std::size_t i = 0; i < selection_->indexes.size(); ++i) {
-      // A description is kept by the channels that it belongs to.
+      // The description's pointer keeps the channels alive, which own it.
       samples_.emplace_back(
           ReportChannel({selection_->found->channels, &selection_->description(selection_->indexes[i])}, count(i)));
     }

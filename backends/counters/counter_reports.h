@@ -14,7 +14,7 @@ namespace quazor {
 
 using CounterValues = std::vector<std::optional<std::uint64_t>>;
 
-// The channels that a backend found when it was asked, and the way to their values.
+// The channels that a backend found in one search, and access to their values.
 //
 // Thread: any, several at once.
 class CounterChannels {
@@ -25,24 +25,25 @@ class CounterChannels {
   virtual ~CounterChannels() = default;
 
   virtual std::size_t size() const = 0;
-  // Valid, and the same, for as long as this object lives.
+  // The reference stays valid and the description unchanged for the lifetime of this object.
   virtual const ReportChannelDescription& description(std::size_t index) const = 0;
-  // The values now of the channels with these indexes, in the order of the indexes and as close together as possible;
-  // no value for a channel that has none or is gone. Nothing, and an error, when they cannot be read.
+  // Returns the current values of the channels with these indexes, in the order of the indexes and sampled as close
+  // together as possible; an element without a value is a channel that has none or was removed. Returns nothing and an
+  // error if the values cannot be read.
   virtual std::optional<CounterValues> read(const std::vector<std::size_t>& indexes, DiagnosticErrorPtr* error) = 0;
   // Stores the backend's error for a baseline that is a snapshot of other channels.
   virtual void refuseBaseline(DiagnosticErrorPtr* error) const = 0;
 };
 
-// Finds the channels; null, and an error, when they cannot be looked for. Thread: any, several at once.
+// Finds the channels; returns null and an error if the search fails. Thread: any, several at once.
 using FindCounters = std::function<std::shared_ptr<CounterChannels>(DiagnosticErrorPtr* error)>;
 
-// Asks `find` at every call of reportWithOnlySimpleChannels(); the channels come in the order of their indexes.
+// Calls `find` in every call of reportWithOnlySimpleChannels(); channels are ordered by index.
 //
-// Counts are unsigned. A difference is taken between snapshots of the same channels of one such call. It is exact, and
-// negative for a count that fell: a driver that reset its counter is seen as what it is, and not as a huge number of
-// events. Only a fall by more than 2^63 is that of a counter which went round its end, and its difference positive. A
-// channel without a count in one of the two snapshots has no difference.
+// Counts are unsigned. Both snapshots of a difference must come from the same such call. A difference is exact, and
+// negative if the count fell, so a counter that the driver reset does not appear as a huge number of events. Only a
+// fall by more than 2^63 is taken for an overflow of the counter and gives a positive difference. A channel without a
+// count in one of the two snapshots has no difference.
 //
 // Thread: any.
 std::shared_ptr<ReportFacility> makeCounterReports(FindCounters find);

@@ -10,7 +10,7 @@
 namespace quazor {
 namespace {
 
-// Values that a test makes up.
+// Channels with values set by a test.
 class ScriptedChannels final : public CounterChannels {
  public:
   explicit ScriptedChannels(std::vector<ConformanceChannel> channels) : channels_(std::move(channels)) {

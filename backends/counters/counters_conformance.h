@@ -1,4 +1,4 @@
-// What every report facility has to do, as a typed test suite.
+// Requirements on every report facility, as a typed test suite.
 #pragma once
 
 #include "contract/message_format.h"
@@ -17,7 +17,7 @@
 
 namespace quazor {
 
-// A channel, and what it counts before and after UnderTest::advance(); nothing where it has no count then.
+// A channel and its count before and after UnderTest::advance(); nothing if it has no count at that time.
 struct ConformanceChannel {
   std::string group;
   std::string subGroup;
@@ -26,12 +26,12 @@ struct ConformanceChannel {
   std::optional<std::uint64_t> after;
 };
 
-// A channel of no particular group that keeps its count.
+// A channel in an arbitrary group with a constant count.
 inline ConformanceChannel steadyChannel(std::string name, std::uint64_t count) {
   return {"g", "s", std::move(name), count, count};
 }
 
-// Tells anything but the snapshots of the facility under test.
+// A snapshot that does not belong to the facility under test.
 class ForeignSnapshot final : public ReportSnapshot {
  public:
   const std::vector<ReportSample>& samples() const override { return samples_; }
@@ -45,12 +45,12 @@ class ForeignSnapshot final : public ReportSnapshot {
 };
 
 // UnderTest has:
-//   void make(std::vector<ConformanceChannel>): the channels of the system, in their order; `before` and `after` are
-//     both numbers or both nothing
+//   void make(std::vector<ConformanceChannel>): creates the channels of the system, in this order; `before` and `after`
+//     are both numbers or both nothing
 //   std::shared_ptr<ReportFacility> facility(): with these channels
-//   void advance(): all channels go on to what they count after it
+//   void advance(): moves all channels to their count after it
 //   void failEnumeration(), void failSnapshot(): the next call fails with an error
-//   void recover(): nothing fails any more
+//   void recover(): calls succeed again
 template <class UnderTest>
 class CountersConformance : public ::testing::Test {
  protected:
@@ -89,7 +89,7 @@ class CountersConformance : public ::testing::Test {
     return texts;
   }
   static Texts now(const Set& set) { return texts(snapshotOf(set)); }
-  // Expects the call to fail, with an error that says something where there is a place for one.
+  // Expects the call to fail and, if it receives an error variable, to set an error with a message.
   template <class Call>
   static void expectFailure(Call&& call, const char* what) {
     DiagnosticErrorPtr error;

@@ -1,12 +1,12 @@
-// What a report facility has to do whose channels come and go, as a typed test suite.
+// Requirements on a report facility whose channels appear and disappear, as a typed test suite.
 #pragma once
 
 #include "backends/counters/counters_conformance.h"
 
 namespace quazor {
 
-// UnderTest is as that of CountersConformance, but `before` and `after` need not both be numbers: the channel comes, or
-// goes away, with advance().
+// UnderTest is that of CountersConformance, except that only one of `before` and `after` may be a number: the channel
+// then appears or disappears in advance().
 template <class UnderTest>
 class PassingCountersConformance : public CountersConformance<UnderTest> {};
 

@@ -50,7 +50,7 @@ std::shared_ptr<const CallInterceptor::Observer> CallInterceptor::currentObserve
   return observer_;
 }
 
-// The faults that act on this call: delays, and behind them at most one that ends it.
+// The faults that apply to this call: delays, followed by at most one fault that ends it.
 std::vector<Fault> CallInterceptor::faultsOn(const CallSite& site) {
   const std::lock_guard lock(mutex_);
   std::vector<Fault> acting;

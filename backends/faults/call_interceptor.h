@@ -1,4 +1,4 @@
-// CallInterceptor: the one place that every call on a platform with faults passes.
+// CallInterceptor: all calls on a platform with faults pass through it.
 #pragma once
 
 #include "backends/faults/fault.h"
@@ -17,49 +17,49 @@
 
 namespace quazor {
 
-// A call as it has returned.
+// A completed call.
 struct PlatformCall {
   std::string operation;  // "CaptureStream.start"
-  std::string object;     // the name of the object, empty where a platform has only one
-  std::string detail;     // the property's key; of setValue "KEY = value"; of control calls the streams "(a, b)"; of
-                          // Clock.sleep the seconds
+  std::string object;     // the name of the object; empty if a platform has only one
+  std::string detail;     // the property's key; "KEY = value" for setValue; the streams "(a, b)" for control calls;
+                          // the seconds for Clock.sleep
   bool succeeded = false;
 
   friend bool operator==(const PlatformCall&, const PlatformCall&) = default;
 };
 
-// What a fault can tell calls apart by. Borrows; lives for one call.
+// The features of a call that faults select by. Borrows its texts; valid for one call.
 struct CallSite {
   std::string_view operation;
   std::string_view object;
   std::string_view property;
 };
 
-// Lets faults act on calls, counts what they did, and tells an observer of every call.
+// Applies faults to calls, counts their effects, and notifies an observer of every call.
 //
-// Thread: any, also several at once. Calls are made, and the observer is told, outside the interceptor's lock.
+// Thread: any, several at once. Calls and notifications are made outside the interceptor's lock.
 class CallInterceptor final {
  public:
   using Observer = std::function<void(const PlatformCall&)>;
-  // Waits for ever, or throws; `what` says what hangs.
+  // Blocks forever or throws; `what` describes the call.
   using Hang = std::function<void(std::string_view what)>;
-  // The error of a call that a fault without an error of its own makes fail; `sentence` says which call failed.
+  // Creates the error for a fault that has none of its own; `sentence` names the failed call.
   using InjectedError = std::function<DiagnosticErrorPtr(const CallSite& site, std::string sentence)>;
 
-  // `clock` times the delays.
+  // `clock` is used for delays.
   CallInterceptor(std::vector<Fault> faults, std::shared_ptr<Clock> clock, Hang hang, InjectedError injectedError);
   CallInterceptor(const CallInterceptor&) = delete;
   CallInterceptor& operator=(const CallInterceptor&) = delete;
 
   void addFault(Fault fault);
-  // In the order of their adding.
+  // In the order of addition.
   std::vector<FaultStatus> faultStatus() const;
-  // Replaces the observer; an empty one observes nothing.
+  // Replaces the observer; an empty one disables notifications.
   void observe(Observer observer);
 
-  // Makes a call that can fail: `body` does it and says by its result, a boolean, an optional or a pointer, whether it
-  // succeeded. Where a fault makes the call fail, the body does not run and the result is false or nothing.
-  // `detail` makes the text for the observer and is asked only when there is one.
+  // Makes a call that can fail: `body` performs it and returns a boolean, an optional or a pointer that tells whether
+  // it succeeded. If a fault makes the call fail, the body does not run and the result is false or nothing. `detail`
+  // creates the text for the observer and is called only if there is one.
   template <class Detail, class Body>
   std::invoke_result_t<Body&> perform(const CallSite& site, DiagnosticErrorPtr* error, Detail&& detail, Body&& body) {
     std::invoke_result_t<Body&> result{};
@@ -74,7 +74,7 @@ class CallInterceptor final {
         site, error, [] { return std::string(); }, body);
   }
 
-  // Tells the observer of a call that has returned.
+  // Notifies the observer of a completed call.
   template <class Detail>
   void report(const CallSite& site, Detail&& detail, bool succeeded) {
     if (const std::shared_ptr<const Observer> observer = currentObserver()) {
@@ -85,7 +85,7 @@ class CallInterceptor final {
  private:
   struct CountedFault {
     FaultStatus status;
-    std::uint64_t taken = 0;  // calls that its selectors took
+    std::uint64_t taken = 0;  // the number of calls that its selectors matched
   };
 
   bool faultsLetPass(const CallSite& site, DiagnosticErrorPtr* error);
@@ -96,12 +96,12 @@ class CallInterceptor final {
   const std::shared_ptr<Clock> clock_;
   const Hang hang_;
   const InjectedError injectedError_;
-  mutable std::mutex mutex_;  // guards what follows
+  mutable std::mutex mutex_;  // guards the members below
   std::vector<CountedFault> faults_;
-  std::shared_ptr<const Observer> observer_;  // null when there is none
+  std::shared_ptr<const Observer> observer_;  // null if there is none
 };
 
-// A hang that sleeps by the clock, for ever.
+// A hang that sleeps forever on that clock.
 CallInterceptor::Hang sleepForEver(std::shared_ptr<Clock> clock);
 
 }  // namespace quazor

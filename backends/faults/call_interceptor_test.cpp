@@ -35,7 +35,7 @@ struct Hung {
 
 class CallInterceptorTest : public ::testing::Test {
  protected:
-  // Makes a call; says "done", "failed" or the error's text.
+  // Makes a call; returns "done", "failed" or the error's text.
   std::string call(std::string_view operation, std::string_view object = {}, std::string_view property = {}) {
     DiagnosticErrorPtr error;
     const bool succeeded = calls_.perform(

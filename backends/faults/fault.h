@@ -1,4 +1,4 @@
-// Fault: one thing that is made to go wrong on a platform.
+// Fault: an injected failure of a platform's calls.
 #pragma once
 
 #include <nlohmann/json_fwd.hpp>
@@ -11,13 +11,13 @@
 namespace quazor {
 
 enum class FaultAction {
-  kFail,     // the call fails with an error: the fault's, or one of the service
-  kNothing,  // the call fails and has no error to give
-  kHang,     // the call never returns: an exception in virtual time, a wait without end in real time
-  kDelay     // the call is made `seconds` late, by the platform's clock
+  kFail,     // the call fails with the fault's error, or with one of the service
+  kNothing,  // the call fails without an error
+  kHang,     // the call never returns: an exception in virtual time, an endless wait in real time
+  kDelay     // the call is delayed by `seconds`, on the platform's clock
 };
 
-// An error that a fault makes a call fail with.
+// The error of a call that fails because of a fault.
 struct FaultError {
   std::string domain;
   std::int64_t code = 0;
@@ -26,31 +26,31 @@ struct FaultError {
   friend bool operator==(const FaultError&, const FaultError&) = default;
 };
 
-// Which calls, and what happens to them. A selector that is not set takes every call.
+// Selects calls and determines their failure. A selector without a value matches every call.
 //
-// When several faults take one call, delays add up, and the first of the others in their order decides.
+// If several faults match one call, delays add up, and the first other fault applies.
 struct Fault {
-  std::string operation;                    // such as "CaptureStream.start"; "*" is every operation that can fail
-  std::optional<std::string> object;        // the name of a camera, a group or a HID device
-  std::optional<std::string> property;      // the key that the call reads or sets, or a feature report ("0xAB")
-  std::optional<std::uint64_t> occurrence;  // the nth call, from 1, among those that the other selectors take
+  std::string operation;                // for example "CaptureStream.start"; "*" matches every operation that can fail
+  std::optional<std::string> object;    // the name of a camera, a group or a HID device
+  std::optional<std::string> property;  // the key that the call reads or sets, or a feature report ("0xAB")
+  std::optional<std::uint64_t> occurrence;  // the nth matching call, starting at 1
   FaultAction action = FaultAction::kFail;
-  std::optional<FaultError> error;  // of kFail
-  double seconds = 0;               // of kDelay
+  std::optional<FaultError> error;  // for kFail
+  double seconds = 0;               // for kDelay
 
   friend bool operator==(const Fault&, const Fault&) = default;
 };
 
-// A fault and how many calls it has changed. One that never fired has proved nothing.
+// A fault and the number of calls that it has changed. A fault that never fired proves nothing.
 struct FaultStatus {
   Fault fault;
   std::uint64_t fired = 0;
 };
 
-// The fault as a file has it (fault_reader.h).
+// The fault in the form of a file (fault_reader.h).
 nlohmann::ordered_json faultJson(const Fault& fault);
 
-// The word of a file for an action.
+// The word for an action in files.
 std::string_view faultActionName(FaultAction action);
 
 }  // namespace quazor

@@ -18,11 +18,11 @@ constexpr std::uint64_t kMaxOccurrence = 1'000'000'000;
 constexpr double kMaxDelay = 1e9;
 constexpr std::string_view kEveryOperation = "*";
 
-// What one selector may name: with one operation, or with all together.
+// The values that a selector accepts for one operation, or for all operations.
 struct Selectable {
   Names names;
-  bool any = false;        // every name
-  bool anyReport = false;  // the ID of every feature report
+  bool any = false;        // all names
+  bool anyReport = false;  // all IDs of feature reports
 
   void add(const std::vector<std::string>& more) {
     for (const std::string& name : more) addName(name);
@@ -30,7 +30,7 @@ struct Selectable {
   void addKeys(CaptureObjectKind kind) {
     for (const CaptureProperty& property : propertiesOf(kind)) addName(property.key);
   }
-  // Where there is no list, `open` becomes true.
+  // Without a list, sets `open` to true.
   void add(const std::optional<std::vector<std::string>>& more, bool& open) {
     if (more) add(*more);
     open = open || !more;

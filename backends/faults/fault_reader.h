@@ -1,4 +1,4 @@
-// Faults as JSON files give them.
+// Reads faults from JSON.
 #pragma once
 
 #include "backends/faults/fault.h"
@@ -10,21 +10,21 @@
 
 namespace quazor {
 
-// What the faults of a platform may name. A list that is not there takes any name, that of
-// feature reports any ID.
+// The objects and properties that the faults of a platform may name. A missing list allows any name or, for feature
+// reports, any ID.
 struct FaultTargets {
   std::vector<std::string> streams;
   std::vector<std::string> groups;
   std::optional<std::vector<std::string>> hidDevices;
   std::optional<std::vector<std::string>> registryProperties;
-  std::optional<std::vector<std::string>> featureReports;  // as hidReportName() writes them
+  std::optional<std::vector<std::string>> featureReports;  // in the form of hidReportName()
 };
 
-// Both throw InputError, "PATH: ...", and are called on any thread.
+// Both throw InputError: "PATH: ...". Any thread.
 
-// An array of faults, each with what it acts on checked against `targets`.
+// Reads an array of faults and checks their selectors against `targets`.
 std::vector<Fault> readFaults(const JsonCursor& cursor, const FaultTargets& targets);
-// A domain, a code and a message.
+// Reads a domain, a code and a message.
 FaultError readFaultError(const JsonCursor& cursor);
 
 }  // namespace quazor

@@ -26,7 +26,7 @@ FaultTargets smallTargets() {
   return targets;
 }
 
-// The first fault of `text`, as JSON again, or what is wrong.
+// The first fault of `text`, converted back to JSON, or the error message.
 std::string read(const std::string& text, const FaultTargets& targets = smallTargets()) {
   const nlohmann::ordered_json document = nlohmann::ordered_json::parse(text);
   try {

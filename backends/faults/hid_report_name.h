@@ -1,4 +1,4 @@
-// How files and faults write the ID of a HID report.
+// The IDs of HID reports as text.
 #pragma once
 
 #include <cstdint>
@@ -7,9 +7,9 @@
 
 namespace quazor {
 
-// "0xAB". Valid for ever.
+// "0xAB". The text is static.
 std::string_view hidReportName(std::uint8_t id);
-// The ID that is written so; nothing for every other text.
+// The ID with that text; nothing for any other text.
 std::optional<std::uint8_t> hidReportNamed(std::string_view text);
 
 }  // namespace quazor

@@ -17,7 +17,7 @@ namespace {
 
 using Calls = std::shared_ptr<CallInterceptor>;
 
-// The value with each of the objects in it replaced by what `replace` gives for it.
+// A copy of the value in which `replace` has replaced each object.
 template <class Replace>
 Value withObjects(const Value& value, const Replace& replace) {
   if (const Array* const array = value.array()) {
@@ -78,7 +78,7 @@ CaptureStreams unwrapped(const CaptureStreams& streams) {
   return inner;
 }
 
-// "(a, b)": the streams' names; foreign ones by their descriptions.
+// "(a, b)": the names of the streams, or the descriptions of foreign ones.
 std::string namesOf(const CaptureStreams& streams) {
   std::vector<std::string> names;
   for (const std::shared_ptr<CaptureStream>& stream : streams) {
@@ -122,7 +122,7 @@ class DeviceObjects final : public std::enable_shared_from_this<DeviceObjects> {
     return wrappers;
   }
 
-  // Properties hold streams and groups: plug-ins see wrappers, and the device gets its own back.
+  // Replaces streams and groups in values of properties: plug-ins receive wrappers, the device its own objects.
   std::optional<Value> wrap(const std::optional<Value>& value);
   static Value unwrap(const Value& value);
 
@@ -242,7 +242,7 @@ class InterceptedDevice final : public CaptureDevice {
   const std::shared_ptr<DeviceObjects> objects_;
 };
 
-// What the plug-ins of a service share. Thread: any.
+// Shared by the plug-ins of a service. Thread: any.
 struct PlugInContext {
   Calls calls;
   std::shared_ptr<const ObjectNames> names;

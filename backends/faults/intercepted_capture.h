@@ -7,7 +7,7 @@
 
 namespace quazor {
 
-// As interceptedPlatform() says. Neither pointer is null.
+// Wraps the service as interceptedPlatform() describes. Neither pointer may be null.
 std::shared_ptr<CaptureService> interceptedCapture(std::shared_ptr<CaptureService> capture,
                                                    std::shared_ptr<CallInterceptor> calls,
                                                    std::shared_ptr<const ObjectNames> names);

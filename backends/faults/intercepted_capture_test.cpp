@@ -13,7 +13,7 @@ namespace {
 
 using ::testing::ElementsAre;
 
-// A device of two streams and their group, which keeps what it is given and gives it back.
+// A device with two streams and their group, which stores the values that it receives and returns them.
 class PairStream final : public CaptureStream {
  public:
   explicit PairStream(std::string name) : name_(std::move(name)) {}

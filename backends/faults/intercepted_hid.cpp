@@ -75,7 +75,7 @@ class InterceptedHidDevice final : public HidDevice {
   const std::string name_;
 };
 
-// What the managers of a service share. Thread: any.
+// Shared by the managers of a service. Thread: any.
 struct HidContext {
   std::shared_ptr<CallInterceptor> calls;
   std::shared_ptr<const ObjectNames> names;
@@ -104,7 +104,7 @@ class InterceptedHidManager final : public HidManager {
         });
   }
   HidDevices devices() override {
-    // The observer is told how many there are, also where a fault hides them.
+    // The observer is notified of the number of devices even if a fault hides them.
     return context_->calls
         ->perform(
             {sensor_operation::kDevices, {}, {}}, nullptr, [&] { return std::to_string(manager_->devices().size()); },

@@ -7,7 +7,7 @@
 
 namespace quazor {
 
-// As interceptedPlatform() says. None of the pointers is null.
+// Wraps the service as interceptedPlatform() describes. No pointer may be null.
 std::shared_ptr<HidService> interceptedHid(std::shared_ptr<HidService> hid, std::shared_ptr<CallInterceptor> calls,
                                            std::shared_ptr<const ObjectNames> names);
 

@@ -13,7 +13,7 @@
 namespace quazor {
 namespace {
 
-// Sleeping cannot fail, so faults do not reach it; observers do. Thread: any.
+// Sleeping cannot fail, so faults do not apply, but observers are notified. Thread: any.
 class InterceptedClock final : public Clock {
  public:
   InterceptedClock(std::shared_ptr<Clock> clock, std::shared_ptr<CallInterceptor> calls)
@@ -32,7 +32,7 @@ class InterceptedClock final : public Clock {
   const std::shared_ptr<CallInterceptor> calls_;
 };
 
-// A thread may be made to have no run loop. Thread: any.
+// A fault may hide the run loop of a thread. Thread: any.
 class InterceptedRunLoops final : public RunLoops {
  public:
   InterceptedRunLoops(std::shared_ptr<RunLoops> runLoops, std::shared_ptr<CallInterceptor> calls)

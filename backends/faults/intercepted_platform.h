@@ -1,4 +1,4 @@
-// interceptedPlatform: a platform on which faults act and whose calls an observer is told of.
+// interceptedPlatform: a platform with faults, whose calls can be observed.
 #pragma once
 
 #include "backends/faults/call_interceptor.h"
@@ -11,17 +11,17 @@
 
 namespace quazor {
 
-// What faults and observers call the objects of which a platform has several. An object without a name here is called
-// by its description.
+// The names that faults and observers use for objects of which a platform has several. An object without a name here is
+// identified by its description.
 struct ObjectNames {
   std::vector<std::string> streams;                          // in the device's order
   std::vector<std::string> groups;                           // in the device's order
   std::function<std::string(const HidDevice&)> hidDevice{};  // any thread; may be empty
 };
 
-// The same services, each call of which passes `calls`; where `platform` has none, there is none. What they hand out is
-// intercepted too, keeps alive what it comes from, and is the same object whenever the platform gives the same.
-// Objects of one platform are not to be handed to another.
+// Wraps the services so that each call passes through `calls`; a service that `platform` lacks stays null. Returned
+// objects are also wrapped. A wrapper keeps its object alive, and equal objects have the same wrapper. Objects of one
+// platform must not be passed to another.
 Platform interceptedPlatform(const Platform& platform, const std::shared_ptr<CallInterceptor>& calls,
                              ObjectNames names);
 

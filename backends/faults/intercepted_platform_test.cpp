@@ -24,7 +24,7 @@ using namespace std::chrono_literals;
 using ::testing::ElementsAre;
 using ::testing::IsEmpty;
 
-// The time that a platform keeps, and what a hang is there.
+// The time of a platform and its kind of hang.
 struct TestTime {
   std::shared_ptr<Clock> clock;
   CallInterceptor::Hang hang;
@@ -40,12 +40,12 @@ TestTime realTime() {
   return {clock, sleepForEver(clock)};
 }
 
-// What an observer was told of a call, in one line.
+// An observed call in one line.
 std::string lineOf(const PlatformCall& call) {
   return call.operation + '|' + call.object + '|' + call.detail + '|' + (call.succeeded ? '+' : '-');
 }
 
-// Hand-made services behind interceptors, in virtual time unless told otherwise.
+// Hand-written services behind interceptors, in virtual time by default.
 class InterceptedPlatformTest : public ::testing::Test {
  protected:
   void intercept(Platform platform, ObjectNames names, TestTime time = virtualTime()) {
@@ -63,7 +63,7 @@ class InterceptedPlatformTest : public ::testing::Test {
     fault_.action = action;
     return fault_;
   }
-  // Makes the fault that was prepared act.
+  // Activates the prepared fault.
   void act() { calls_->addFault(fault_); }
   void act(std::string_view operation, FaultAction action) {
     addFault(operation, action);
@@ -82,7 +82,7 @@ class InterceptedPlatformTest : public ::testing::Test {
   Fault fault_;
 };
 
-// "done", or what the failure told.
+// "done", or the error message.
 template <class Call>
 std::string outcomeOf(Call&& call) {
   DiagnosticErrorPtr error;
@@ -168,7 +168,7 @@ TEST_F(CameraUnderFaults, DelaysTakeVirtualTime) {
   const std::chrono::nanoseconds before = platform_.clock->now();
   EXPECT_EQ(start(), "done");
   EXPECT_EQ(platform_.clock->now() - before, 1h);
-  EXPECT_THAT(takeSeen(), ElementsAre("CaptureStream.start|infrared||+"));  // the delay is no sleep of the caller
+  EXPECT_THAT(takeSeen(), ElementsAre("CaptureStream.start|infrared||+"));  // the delay is not a sleep of the caller
 }
 
 TEST_F(CameraUnderFaults, DelaysTakeRealTime) {
@@ -192,7 +192,7 @@ TEST_F(CameraUnderFaults, AHangEndsVirtualTime) {
   EXPECT_THAT(takeSeen(), IsEmpty());
 }
 
-// A clock that ends the wait when it has been asked to sleep for ever.
+// A clock that throws instead of sleeping forever.
 class ImpatientClock final : public Clock {
  public:
   struct Waited {

@@ -18,7 +18,7 @@ class InterceptedSnapshot final : public ReportSnapshot {
   InterceptedSnapshot(std::shared_ptr<const ReportSnapshot> snapshot, ReportCalls calls)
       : snapshot_(std::move(snapshot)), calls_(std::move(calls)) {}
 
-  // Null for null.
+  // Returns null for null.
   static std::shared_ptr<const ReportSnapshot> of(std::shared_ptr<const ReportSnapshot> snapshot,
                                                   const ReportCalls& calls) {
     return snapshot == nullptr ? nullptr : std::make_shared<const InterceptedSnapshot>(std::move(snapshot), calls);

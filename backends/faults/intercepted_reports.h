@@ -8,7 +8,7 @@
 
 namespace quazor {
 
-// As interceptedPlatform() says. Neither pointer is null.
+// Wraps the facility as interceptedPlatform() describes. Neither pointer may be null.
 std::shared_ptr<ReportFacility> interceptedReports(std::shared_ptr<ReportFacility> reports,
                                                    std::shared_ptr<CallInterceptor> calls);
 

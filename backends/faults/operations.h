@@ -1,4 +1,4 @@
-// The operations of a platform, by name: what faults select and observers are told of.
+// The operations of a platform by name, for faults and observers.
 #pragma once
 
 #include "backends/capture/property_table.h"
@@ -35,13 +35,13 @@ inline constexpr std::string_view kCurrentRunLoop = "RunLoops.currentRunLoop";
 // Cannot fail, so faults do not reach it; observers do.
 inline constexpr std::string_view kClockSleep = "Clock.sleep";
 
-// Which of a platform's services an operation belongs to. The display and the run loops count as the sensors'.
+// The service that an operation belongs to. The display and the run loops belong to the sensors.
 enum class OperationService { kCapture, kReports, kSensors };
 
-// On which kind of object an operation is called. A platform has one of each of the others.
+// The kind of object that an operation belongs to. A platform has only one object of each other kind.
 enum class OperationObject { kOnlyOne, kStream, kGroup, kHidDevice };
 
-// What an operation reads or sets.
+// The property that an operation reads or sets.
 enum class OperationProperty { kNone, kOfDevice, kOfGroup, kOfStream, kFeatureReport, kOfRegistry };
 
 struct Operation {
@@ -51,7 +51,7 @@ struct Operation {
   OperationProperty property = OperationProperty::kNone;
 };
 
-// The operations that faults reach. One that has no answer, such as HidDevice.close, has no effect when it fails.
+// The operations that faults apply to. One without a result, such as HidDevice.close, has no effect if it fails.
 inline constexpr std::array kOperations{
     Operation{capture_operation::kCreatePlugIn, OperationService::kCapture},
     Operation{capture_operation::kDefaultPlugIn, OperationService::kCapture},
@@ -96,7 +96,7 @@ inline constexpr std::array kOperations{
     Operation{sensor_operation::kCurrentRunLoop, OperationService::kSensors},
 };
 
-// The operation of that name, or null.
+// The operation with that name, or null.
 const Operation* findOperation(std::string_view name);
 
 }  // namespace quazor

@@ -1,4 +1,4 @@
-// WrapperCache: one wrapper for each wrapped object, for as long as somebody holds it.
+// WrapperCache: one wrapper per wrapped object, during the lifetime of the wrapper.
 #pragma once
 
 #include <map>
@@ -8,7 +8,7 @@
 
 namespace quazor {
 
-// A wrapper must keep alive what it wraps, so that no other object can have that address while the wrapper lives.
+// A wrapper must keep its object alive, so that no other object has the same address while the wrapper exists.
 //
 // Thread: any.
 template <class Wrapped, class Wrapper>
@@ -18,7 +18,7 @@ class WrapperCache final {
   WrapperCache(const WrapperCache&) = delete;
   WrapperCache& operator=(const WrapperCache&) = delete;
 
-  // The wrapper of `wrapped`; `make` makes one, under the cache's lock, where nobody holds one. Null for null.
+  // Returns the wrapper of `wrapped`; calls `make`, under the cache's lock, if none exists. Returns null for null.
   template <class Make>
   std::shared_ptr<Wrapper> wrapperOf(const std::shared_ptr<Wrapped>& wrapped, Make&& make) {
     if (wrapped == nullptr) return nullptr;

@@ -1,4 +1,4 @@
-// What every HID service has to do, as a typed test suite.
+// Requirements on every HID service, as a typed test suite.
 #pragma once
 
 #include "contract/message_format.h"
@@ -30,7 +30,7 @@ struct ConformanceDevice {
   std::uint16_t usage = 0x24;
 };
 
-// What comes from a device in place of a report.
+// An input from a device other than a report.
 enum class ConformanceEvent { kError, kRemoval };
 
 inline Dictionary hidUsage(Value page, Value usage) {
@@ -38,11 +38,12 @@ inline Dictionary hidUsage(Value page, Value usage) {
 }
 
 // UnderTest has:
-//   void connect(std::vector<ConformanceDevice>, std::map<int, ConformanceEvent>): a new system with these devices, in
-//     their order, and by number, from 1, the inputs that are not reports. All have feature report 0xAB of two bytes.
+//   void connect(std::vector<ConformanceDevice>, std::map<int, ConformanceEvent>): creates a new system with these
+//     devices, in this order. The map contains the inputs that are not reports, by number, starting at 1. All devices
+//     have the feature report 0xAB of two bytes.
 //   std::shared_ptr<HidManager> manager()
-//   void arrive(int count): so many inputs come from the only device, which is open. They are numbered from 1 while the
-//     system lives. A report has ID 0x76 and its number, little-endian, in bytes 4 to 7.
+//   void arrive(int count): delivers that many inputs from the only device, which is open. They are numbered from 1
+//     for the lifetime of the system. A report has ID 0x76 and its number, little-endian, in bytes 4 to 7.
 //   RunLoops& runLoops(), Concurrency& concurrency(): also before connect()
 template <class UnderTest>
 class HidConformance : public ::testing::Test {
@@ -53,7 +54,7 @@ class HidConformance : public ::testing::Test {
 
   ~HidConformance() override { drop(); }
 
-  // The only device, with a receiver that writes down what comes: "1" for the report of that number, or "error".
+  // Connects one device whose receiver records inputs: "1" for the report with that number, or "error".
   void connect(const Events& events = {}) {
     drop();
     under_test_.connect({ConformanceDevice{}}, events);
@@ -65,7 +66,7 @@ class HidConformance : public ::testing::Test {
     ASSERT_TRUE(device_->open(nullptr));
     schedule();
   }
-  // The device goes while it may be scheduled, and its loop lets go of it.
+  // Releases the device, which may be scheduled, and lets its loop release it.
   void drop() {
     device_ = nullptr;
     run();
@@ -87,11 +88,11 @@ class HidConformance : public ::testing::Test {
   RunLoopResult run(std::string_view mode = kRunLoopDefaultMode) {
     return loop().runInMode(mode, std::chrono::nanoseconds::zero(), false);
   }
-  // Whether the loop has nothing to wait for.
+  // True if the loop has no source to wait for.
   bool isIdle(std::string_view mode = kRunLoopDefaultMode) {
     return loop().runInMode(mode, std::chrono::milliseconds(1), false) == RunLoopResult::kFinished;
   }
-  // The call is made on another thread, which has a loop of its own, and has returned.
+  // Makes the call on another thread, which has its own loop, and waits for it to return.
   void onOtherThread(const std::function<void(RunLoop&)>& call) {
     const auto done = under_test_.concurrency().makeSemaphore(0);
     const auto queue = under_test_.concurrency().makeSerialQueue("other", QualityOfService::kDefault);
@@ -116,7 +117,7 @@ class HidConformance : public ::testing::Test {
   bool setFeature(DiagnosticErrorPtr* error, const Bytes& payload = {0xAB, 1}) {
     return device_->setFeatureReportWithID(0xAB, payload, error);
   }
-  // Expects the call to fail, with an error that says something where there is a place for one.
+  // Expects the call to fail and, if it receives an error variable, to set an error with a message.
   template <class Call>
   static void expectFailure(Call&& call, const char* what) {
     DiagnosticErrorPtr error;

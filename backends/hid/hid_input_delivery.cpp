@@ -17,7 +17,8 @@ void HidInputDelivery::schedule(RunLoop& loop, std::string_view mode) {
   const auto place = std::make_shared<Place>();
   place->loop = &loop;
   place->mode = mode;
-  // The handler does not keep this object, which ends with its user; then it ends its own source.
+  // The handler must not extend the lifetime of this object. Once the object is gone, the handler removes its own
+  // source.
   const std::shared_ptr<RunLoopSource> source = loop.makeSource([weak = weak_from_this(), place] {
     const std::shared_ptr<HidInputDelivery> self = weak.lock();
     if (self == nullptr || !self->deliver(*place)) place->loop->removeSource(place->source.lock(), place->mode);
@@ -71,8 +72,8 @@ bool HidInputDelivery::isScheduled(const Place& place) const {
   return std::ranges::any_of(places_, [&](const Scheduled& scheduled) { return scheduled.place.get() == &place; });
 }
 
-// Handles a place's source: false when the device is not scheduled there any more. A receiver that is slower than the
-// device must not keep its loop from its other sources and its time limit, so a round has an end.
+// Handles the source of a place. Returns false if the device is no longer scheduled there. The number of inputs per
+// round is limited: a receiver that is slower than the device must not starve other sources or the loop's time limit.
 bool HidInputDelivery::deliver(const Place& place) {
   {
     const std::lock_guard lock(mutex_);
@@ -84,7 +85,7 @@ bool HidInputDelivery::deliver(const Place& place) {
   return true;
 }
 
-// Checks everything again: the receiver may have changed all of it.
+// Checks all state again, because the receiver may have changed it.
 bool HidInputDelivery::deliverNext(const Place& place) {
   std::shared_ptr<const HidInput> input;
   Receiver receiver;

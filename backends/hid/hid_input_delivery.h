@@ -1,4 +1,4 @@
-// HidInputDelivery: how the input reports of a device reach the receiver of one of its users on run loops.
+// HidInputDelivery: delivers the input reports of a device to one user's receiver on run loops.
 #pragma once
 
 #include "contract/value.h"
@@ -14,35 +14,35 @@
 
 namespace quazor {
 
-// What comes from a device: a report with its ID first, or else an error.
+// An input from a device: a report that begins with its ID, or an error.
 struct HidInput {
   Bytes report;
   DiagnosticErrorPtr error;
 };
 
-// Hands inputs to the receiver, one after the other, while a loop that the device is scheduled on runs. Where they come
-// from, and how a loop hears of them, is the derived class's.
+// Delivers inputs one after the other to the receiver while a loop that the device is scheduled on runs. The derived
+// class supplies the inputs and signals the loops.
 //
-// Thread: one at a time, but for retire(). The receiver is called without any lock, and may call everything here.
+// Thread: one at a time, except retire(). The receiver is called without any lock and may call all of these functions.
 class HidInputDelivery : public std::enable_shared_from_this<HidInputDelivery> {
  public:
-  // How many inputs a source hands on before other sources of the loop, and its time limit, have their turn.
+  // The maximum number of inputs per round, after which other sources and the time limit of the loop have their turn.
   static constexpr std::size_t kMaxInARound = 64;
 
   HidInputDelivery(const HidInputDelivery&) = delete;
   HidInputDelivery& operator=(const HidInputDelivery&) = delete;
   virtual ~HidInputDelivery() = default;
 
-  // Replaces the receiver. One that is running is destroyed when it has returned.
+  // Replaces the receiver. A receiver that is running is destroyed after it has returned.
   void setReceiver(HidDevice::InputReportCallback receiver);
   void schedule(RunLoop& loop, std::string_view mode);
   void unschedule(RunLoop& loop, std::string_view mode);
-  // The user is gone: nothing is received any more. Loops that the device is still scheduled on must be alive; each
-  // lets go of its source the next time it runs. Thread: any, also while a loop calls the receiver.
+  // Ends the delivery, because the user is gone. Loops that the device is still scheduled on must be alive; each
+  // releases its source in its next run. Thread: any, also while a loop calls the receiver.
   void retire();
 
  protected:
-  // A loop and a mode that the device is scheduled on. The handler of its source holds it.
+  // A loop and a mode that the device is scheduled on, owned by the handler of its source.
   struct Place {
     RunLoop* loop = nullptr;
     std::string mode;
@@ -58,23 +58,24 @@ class HidInputDelivery : public std::enable_shared_from_this<HidInputDelivery> {
 
   // All of these are called with the mutex held.
   //
-  // The next input, or null when none waits.
+  // The next input; null if none is pending.
   virtual std::shared_ptr<const HidInput> next(const Place& place) = 0;
-  // The device was scheduled here, was unscheduled, or had its user go while it was scheduled on all of places().
+  // Called after the device was scheduled here, after it was unscheduled, and when its user goes while it is scheduled
+  // at all of places().
   virtual void onScheduled(const Place& place) = 0;
   virtual void onUnscheduled(const Place& place) = 0;
   virtual void onRetired() = 0;
-  // The place's source is about to hand inputs on. The receiver may run the loop meanwhile, and gets the next input
+  // Called before the source of a place delivers inputs. The receiver may run the loop; it then gets the next input
   // there if the place is signalled again.
   virtual void onRoundBegan(const Place& place) = 0;
 
-  // Has the loop call for the next inputs of that place. With the mutex held, so that nobody is called for a place that
-  // the device is not scheduled on any more.
+  // Makes the loop request the next inputs for that place. Call it with the mutex held, so that a place that has been
+  // unscheduled is never signalled.
   static void signal(const Place& place);
-  // Where the device is scheduled, in the order in which it was. With the mutex held.
+  // The places that the device is scheduled at, in scheduling order. Call it with the mutex held.
   const std::vector<Scheduled>& places() const { return places_; }
 
-  mutable std::mutex mutex_;  // guards what follows, and what derived classes have
+  mutable std::mutex mutex_;  // guards the members below and those of derived classes
 
  private:
   using Receiver = std::shared_ptr<const HidDevice::InputReportCallback>;
@@ -84,7 +85,7 @@ class HidInputDelivery : public std::enable_shared_from_this<HidInputDelivery> {
   bool isScheduled(const Place& place) const;
   std::vector<Scheduled>::const_iterator find(const RunLoop& loop, std::string_view mode) const;
 
-  Receiver receiver_;  // null when there is none
+  Receiver receiver_;  // null if there is none
   std::vector<Scheduled> places_;
 };
 

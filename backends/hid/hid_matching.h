@@ -1,4 +1,4 @@
-// Which HID devices a user asks for.
+// Matching of HID devices.
 #pragma once
 
 #include "contract/value.h"
@@ -9,7 +9,7 @@
 
 namespace quazor {
 
-// What a collection or a control is for, by the HID usage tables; page 0xFF00 and above are the vendors'.
+// The purpose of a collection or a control according to the HID usage tables; pages from 0xFF00 are vendor-defined.
 struct HidUsage {
   std::uint16_t page = 0;
   std::uint16_t usage = 0;
@@ -17,8 +17,8 @@ struct HidUsage {
   bool operator==(const HidUsage&) const = default;
 };
 
-// Whether one of the dictionaries has no entry that a device with this primary usage lacks. A device whose usage is not
-// known has no entries. Thread: any.
+// True if all entries of one of the dictionaries match a device with this primary usage. A device whose usage is
+// unknown has no entries. Thread: any.
 bool matchesHidDevice(const std::vector<Dictionary>& matching, const std::optional<HidUsage>& primary);
 
 }  // namespace quazor

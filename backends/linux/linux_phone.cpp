@@ -20,7 +20,7 @@ DiagnosticErrorPtr injectedError(const CallSite& /*site*/, std::string sentence)
                           nullptr);
 }
 
-// As the binding's faults select them; the device has its streams and groups in the binding's order.
+// The names by which faults select objects. The device has its streams and groups in the binding's order.
 ObjectNames namesOf(const Binding& binding) {
   ObjectNames names;
   for (const CameraBinding& camera : binding.cameras) names.streams.push_back(camera.port);

@@ -12,10 +12,11 @@
 
 namespace quazor {
 
-// All services of this machine by a binding, in real time. Devices are looked for when they are used, so that what is
-// not there is an error of the call that needs it. The binding's faults act on the services; a hang never returns.
+// All services of this machine, as configured by a binding, in real time. Devices are looked up when they are used, so
+// a missing device is an error of the call that needs it. The binding's faults apply to all services; a hang never
+// returns.
 //
-// Thread: any; the platform's services as they say.
+// Thread: any; platform services have their own rules.
 class LinuxPhone final {
  public:
   explicit LinuxPhone(const Binding& binding);
@@ -24,16 +25,16 @@ class LinuxPhone final {
   LinuxPhone(const LinuxPhone&) = delete;
   LinuxPhone& operator=(const LinuxPhone&) = delete;
 
-  // The same services at every call; they keep alive what they need and may outlive the phone.
+  // Returns the same services in every call. They may outlive the phone.
   Platform platform() const { return platform_; }
   // In the order of the binding.
   std::vector<FaultStatus> faultStatus() const;
-  // How many frames its cameras have handed to handlers.
+  // The number of frames that its cameras have passed to handlers.
   std::uint64_t framesDelivered() const { return capture_->framesDelivered(); }
 
  private:
   const std::shared_ptr<LinuxCapture> capture_;
-  std::shared_ptr<CallInterceptor> calls_;  // null without faults
+  std::shared_ptr<CallInterceptor> calls_;  // null if there are no faults
   Platform platform_;
 };
 

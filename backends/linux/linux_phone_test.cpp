@@ -33,7 +33,7 @@ TEST(LinuxPhone, HasEveryServiceOnAMachineWithoutDevices) {
   EXPECT_THAT(phone.faultStatus(), IsEmpty());
 }
 
-// The made-up cameras of a machine whose binding has faults, and a user of them.
+// Fake cameras of a machine whose binding has faults, and a user of them.
 class FaultyLinuxPhoneTest : public ::testing::Test {
  protected:
   Fault& fault(std::string_view operation, FaultAction action) {

@@ -11,7 +11,7 @@
 
 namespace quazor {
 
-// A log line as the back-end got it.
+// A log line as the backend received it.
 struct LogRecord {
   LogLevel level = LogLevel::kDefault;
   std::string subsystem;
@@ -21,18 +21,18 @@ struct LogRecord {
   friend bool operator==(const LogRecord&, const LogRecord&) = default;
 };
 
-// For tests that compare records: on failure they are printed as level/subsystem/category/text.
+// Tests print records as level/subsystem/category/text when a comparison fails.
 std::ostream& operator<<(std::ostream& out, const LogRecord& record);
 
-// Keeps every line, in the order in which they came, until it is taken.
+// Keeps all lines in order until they are taken.
 // Thread: any.
 class RecordingLog final : public LogBackend {
  public:
   void write(LogLevel level, std::string_view subsystem, std::string_view category, std::string_view text) override;
 
-  // A copy of what is kept.
+  // A copy of the kept records.
   std::vector<LogRecord> records() const;
-  // What is kept; from then on it is kept no more.
+  // Moves out the kept records.
   std::vector<LogRecord> takeRecords();
 
  private:

@@ -30,7 +30,7 @@ std::string timeText(Date date) {
   return defaultText(date).substr(0, kUpToTheSecond) + "." + std::string(3 - digits.size(), '0') + digits;
 }
 
-// Writes all of it, as far as the descriptor takes it.
+// Writes all bytes unless the descriptor reports an error.
 void writeAll(int descriptor, std::string_view bytes) {
   while (!bytes.empty()) {
     const ssize_t written = ::write(descriptor, bytes.data(), bytes.size());

@@ -1,4 +1,4 @@
-// StandardErrorLog: log lines for people, on the standard error stream.
+// StandardErrorLog: user-readable log lines on standard error.
 #pragma once
 
 #include "contract/log_channel.h"
@@ -11,19 +11,19 @@
 
 namespace quazor {
 
-// One line of the log as people read it, with the closing newline:
+// Formats a log line for users, including the newline:
 //
 //   2026-11-21 01:08:00.250 error quazor: Failed to get the capture plug-in!
 //
-// The time is UTC, to the millisecond. The further lines of a text are indented by four spaces, so that each record
-// still begins at the margin.
+// The time is UTC with millisecond precision. Continuation lines of a text are indented by four spaces, so that each
+// record begins at the margin.
 std::string readableLogLine(Date date, LogLevel level, std::string_view category, std::string_view text);
 
-// Hands each line to the stream with one call, so that lines of several threads never mix.
+// Writes each line with one call, so that lines of several threads are not mixed.
 // Thread: any.
 class StandardErrorLog final : public LogBackend {
  public:
-  // `clock` dates the lines. `descriptor` is borrowed and stays open: a test gives its own.
+  // `clock` provides the dates. `descriptor` is borrowed and must stay open; tests pass their own.
   explicit StandardErrorLog(std::shared_ptr<const Clock> clock, int descriptor = 2);
 
   void write(LogLevel level, std::string_view subsystem, std::string_view category, std::string_view text) override;
@@ -31,7 +31,8 @@ class StandardErrorLog final : public LogBackend {
  private:
   const std::shared_ptr<const Clock> clock_;
   const int descriptor_;
-  // Held while a line is written: what a pipe cannot take in one piece comes in several. Nothing else is called then.
+  // Held during a write, because a pipe may take a long line in several pieces. Nothing else is called while it is
+  // held.
   std::mutex mutex_;
 };
 

@@ -59,7 +59,7 @@ TEST(ReadableLogLineTest, ShowsTimeLevelCategoryAndText) {
     EXPECT_EQ(readableLogLine(row.date, row.level, "quazor", row.text), row.line) << row.name;
 }
 
-// A pair of connected descriptors that keeps what each write wrote apart.
+// A pair of connected descriptors that preserves the boundaries of writes.
 class StandardErrorLogTest : public ::testing::Test {
  protected:
   StandardErrorLogTest() {
@@ -69,7 +69,7 @@ class StandardErrorLogTest : public ::testing::Test {
     for (const int end : ends_) ::close(end);
   }
 
-  // What one write wrote.
+  // The bytes of one write.
   std::string receive() {
     std::string packet(100'000, '\0');
     const ssize_t size = ::recv(ends_[1], packet.data(), packet.size(), MSG_DONTWAIT);
@@ -97,7 +97,7 @@ TEST_F(StandardErrorLogTest, ALineThatCannotBeWrittenIsDropped) {
 TEST(StandardErrorLogPipeTest, ALineIsWrittenWholeAlthoughASignalInterruptsIt) {
   struct sigaction action {};
   struct sigaction before {};
-  action.sa_handler = [](int) {};  // without SA_RESTART: the call returns what it has written so far
+  action.sa_handler = [](int) {};  // without SA_RESTART, write() returns the count so far
   ASSERT_EQ(::sigaction(SIGUSR1, &action, &before), 0);
   std::array<int, 2> ends{-1, -1};
   ASSERT_EQ(::pipe2(ends.data(), O_CLOEXEC), 0);
@@ -136,7 +136,7 @@ TEST(StandardErrorLogPipeTest, LongLinesOfSeveralThreadsDoNotMix) {
     StandardErrorLog log(std::make_shared<FixedClock>(), ends[1]);
     std::vector<std::thread> writers;
     for (const char letter : {'a', 'b', 'c'}) {
-      writers.emplace_back([&log, letter] {  // longer than what a pipe takes in one piece
+      writers.emplace_back([&log, letter] {  // longer than a pipe takes in one piece
         for (int i = 0; i < kLines; ++i) log.write(LogLevel::kError, "s", "quazor", std::string(100'000, letter));
       });
     }

@@ -10,7 +10,7 @@ namespace quazor {
 
 namespace {
 
-// Cuts between UTF-8 characters, which have at most three bytes after their first.
+// Truncates between UTF-8 characters, whose first byte is followed by at most three.
 std::string_view cut(std::string_view text, std::size_t size) {
   if (text.size() <= size) return text;
   for (int i = 0; i < 3 && continuesUtf8(text[size]); ++i) --size;

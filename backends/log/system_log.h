@@ -1,4 +1,4 @@
-// SystemLog: log lines for the system's own log.
+// SystemLog: writes to the system log.
 #pragma once
 
 #include "contract/log_channel.h"
@@ -10,16 +10,16 @@
 
 namespace quazor {
 
-// Gives each line to syslog(3), as "category: text", under the name kIdentifier.
+// Passes each line to syslog(3) as "category: text", with the identifier kIdentifier.
 // Thread: any.
 class SystemLog final : public LogBackend {
  public:
   static constexpr char kIdentifier[] = "quazor";
-  // Texts are cut to this many bytes, between characters: syslog sends one datagram for each line, and loses what does
-  // not fit in it.
+  // Texts are truncated to this many bytes, between characters. syslog sends each line in one datagram and loses what
+  // exceeds it.
   static constexpr std::size_t kMaxTextLength = std::size_t{48} * 1024;
 
-  // Stands in for syslog(3) in tests. `priority` is a level of syslog(3).
+  // Replaces syslog(3) in tests. `priority` is a syslog(3) level.
   using Syslog = std::function<void(int priority, const std::string& line)>;
 
   SystemLog();

@@ -17,7 +17,7 @@ using ::testing::Pair;
 
 class SystemLogTest : public ::testing::Test {
  protected:
-  // The text of the only line, without its category.
+  // Returns the text of the only line, without its category.
   std::string written(const std::string& text) {
     lines_.clear();
     log_.write(LogLevel::kError, "s", "c", text);

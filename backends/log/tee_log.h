@@ -1,4 +1,4 @@
-// TeeLog: one log line for several back-ends.
+// TeeLog: sends log lines to several backends.
 #pragma once
 
 #include "contract/log_channel.h"
@@ -9,11 +9,11 @@
 
 namespace quazor {
 
-// Hands every line to each of its back-ends, in their order. Any thread, as far as they allow it.
+// Passes each line to all of its backends, in order. Has the thread rules of its backends.
 // Thread: any.
 class TeeLog final : public LogBackend {
  public:
-  // None of them may be null.
+  // No pointer may be null.
   explicit TeeLog(std::vector<std::shared_ptr<LogBackend>> backends);
 
   void write(LogLevel level, std::string_view subsystem, std::string_view category, std::string_view text) override;

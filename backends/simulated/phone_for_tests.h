@@ -14,7 +14,7 @@
 namespace quazor {
 
 // Cameras "wide", "tele" and "front", with two formats of at most 30 and 60 frames per second; group "back" of the
-// first two with master "wide", group "selfie" of the last.
+// first two with master "wide", group "selfie" of the third.
 inline Scenario smallScenario() {
   Scenario scenario;
   scenario.title = "A small phone";
@@ -31,7 +31,7 @@ inline Scenario smallScenario() {
   return scenario;
 }
 
-// What a call that takes an error out-argument ended in, for comparisons: "done", or the error's text.
+// The result of a call with an error out-argument, for comparisons: "done", or the error's text.
 template <class Call>
 std::string outcome(Call&& call) {
   DiagnosticErrorPtr error;
@@ -40,7 +40,7 @@ std::string outcome(Call&& call) {
   return defaultText(error);
 }
 
-// An error of the service as outcome() tells it.
+// An error of the service as formatted by outcome().
 inline std::string refusal(CaptureErrorCode code, std::string_view message) {
   return formatMessage("%@ code %@: %@", SimulatedCaptureErrorDomain, static_cast<std::int64_t>(code), message);
 }
@@ -75,7 +75,7 @@ struct PhoneUser {
   CaptureStreams streams;
 };
 
-// A configuration that any slave of a group takes.
+// A configuration that is valid for any slave of a group.
 inline Dictionary slaveConfiguration() {
   return {{"StreamingOutputsEnabled", true},
           {"FrameSkippingEnabled", false},

@@ -21,7 +21,7 @@
 namespace quazor {
 namespace {
 
-// As the scenario's faults select them; the device has its streams and groups in the scenario's order.
+// The names by which faults select objects. The device has its streams and groups in the scenario's order.
 ObjectNames namesOf(const Scenario& scenario) {
   ObjectNames names;
   for (const Camera& camera : scenario.cameras) names.streams.push_back(camera.id);

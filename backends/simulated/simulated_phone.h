@@ -1,4 +1,4 @@
-// SimulatedPhone: a whole phone behind the platform's services, as a scenario describes it.
+// SimulatedPhone: a complete phone that implements the platform's services as a scenario describes.
 #pragma once
 
 #include "backends/faults/call_interceptor.h"
@@ -18,43 +18,43 @@
 namespace quazor {
 
 enum class PhoneTime {
-  kVirtual,  // one thread; sleeping costs nothing, and one seed is one order of events
-  kReal      // real threads and the real clock; the seed is not used
+  kVirtual,  // one thread; sleeping takes no real time, and a seed determines the order of events
+  kReal      // real threads and the real clock; the seed has no effect
 };
 
-// What plug-ins see is platform(); everything else here is the bench's side, for the host and for tests.
+// Plug-ins only see platform(); the other functions are for the host and for tests.
 //
-// Errors: the service refuses what a real one would, with errors of its own (capture_error.h). In virtual time a call
-//   that can never return throws SimulationStall, the only exception that comes out of the platform.
-// Thread: in virtual time one thread for the phone and all that came from it; in real time as the platform's services
-//   say. The bench's side: any.
+// Errors: the service rejects what a real one would, with errors of its own (capture_error.h). In virtual time a call
+//   that can never return throws SimulationStall, the only exception of the platform.
+// Thread: in virtual time one thread for the phone and everything that it created; in real time the rules of the
+//   platform's services. All other functions: any.
 class SimulatedPhone final {
  public:
-  // Throws std::invalid_argument when the scenario is not consistent; one that readScenario has read is.
+  // Throws std::invalid_argument if the scenario is inconsistent, which readScenario() rules out.
   SimulatedPhone(const Scenario& scenario, PhoneTime time, std::uint64_t seed);
-  // In virtual time, on a scheduler of the caller's choice, so that a test can hand in its own Chooser.
+  // In virtual time on the caller's scheduler, which may have any ScheduleStrategy.
   SimulatedPhone(const Scenario& scenario, std::shared_ptr<VirtualScheduler> scheduler);
-  // On a clock and queues of the caller's choice; run loops keep real time. A hang sleeps by that clock, for ever.
+  // On the caller's clock and queues; run loops use real time. A hang sleeps forever on that clock.
   SimulatedPhone(const Scenario& scenario, const std::shared_ptr<Clock>& clock,
                  std::shared_ptr<Concurrency> concurrency);
   SimulatedPhone(const SimulatedPhone&) = delete;
   SimulatedPhone& operator=(const SimulatedPhone&) = delete;
-  // The phone's services go on working for those who hold them; tasks that are pending in virtual time are destroyed,
-  // since nothing runs them any more.
+  // The services keep working for those who hold them. Pending tasks in virtual time are destroyed, because nothing
+  // would run them.
   ~SimulatedPhone();
 
-  // The same services at every call; they keep alive what they need.
+  // Returns the same services in every call; they own what they need.
   Platform platform() const { return platform_; }
 
-  // In the order of the scenario, then of addFault.
+  // In the order of the scenario, then of addFault().
   std::vector<FaultStatus> faultStatus() const;
-  // Another fault, from the next call on.
+  // Adds a fault, which takes effect with the next call.
   void addFault(Fault fault);
-  // Hands every call on the platform to `observer`, in order, as it returns, on the thread that made it. A call that
-  // never returns is not handed on. Replaces an earlier observer.
+  // Calls `observer` after every call on the platform, in order and on the calling thread. A call that never returns is
+  // not observed. Replaces an earlier observer.
   void observeCalls(std::function<void(const PlatformCall&)> observer);
-  // The frames whose pixel buffers have not been given back, by camera and number. A buffer may be used as long as the
-  // phone or a device of it lives.
+  // The frames whose pixel buffers have not been released, by camera and number. A buffer is valid as long as the phone
+  // or a device of it exists.
   struct HeldBuffer {
     std::string camera;
     std::uint64_t frame = 0;
@@ -62,15 +62,15 @@ class SimulatedPhone final {
     friend bool operator==(const HeldBuffer&, const HeldBuffer&) = default;
   };
   std::vector<HeldBuffer> buffersHeld() const;
-  // How many frames have been handed to handlers, of all cameras; one that is being handled counts.
+  // The number of frames passed to handlers, for all cameras, including those that are being handled.
   std::uint64_t framesDelivered() const { return hardware_->pool->taken(); }
-  // How often a pixel buffer was released that nobody held.
+  // The number of releases of a pixel buffer without a matching reference.
   std::uint64_t strayReleases() const { return hardware_->pool->strayReleases(); }
-  // Hands the next `count` frames of the camera's running stream to its handler at once, on this thread, whatever time
-  // it is; these count from 0, apart from the frames that come by themselves. Returns how many were delivered: 0 when
-  // the stream does not run or has no handler. Throws std::invalid_argument when there is no such camera.
+  // Passes the next `count` frames of the camera's running stream to its handler immediately, on this thread. These
+  // frames are numbered from 0, independently of the regular frames. Returns the number of delivered frames: 0 if the
+  // stream does not run or has no handler. Throws std::invalid_argument if there is no such camera.
   std::uint64_t deliverFrames(std::string_view camera, std::uint64_t count);
-  // What runs the phone in virtual time; null in real time.
+  // The scheduler of virtual time; null in real time.
   VirtualScheduler* scheduler() const { return scheduler_.get(); }
 
  private:

@@ -26,7 +26,7 @@ Fault fault(std::string operation, FaultAction action, std::optional<std::string
   return fault;
 }
 
-// A clock that a test moves; it gives up a sleep that would never end.
+// A clock that a test advances; it fails a sleep that would never end.
 class SteppedClock final : public Clock {
  public:
   struct NeverEnds {};
@@ -163,7 +163,7 @@ TEST(SimulatedPhone, AHangInVirtualTimeEndsTheWait) {
     FAIL() << "the call returned";
   } catch (const SimulationStall& stall) {
     EXPECT_STREQ(stall.what(),
-                 "The simulated phone waits for ever: CaptureStream.start of wide hangs, at 3 s of virtual time.");
+                 "The simulated phone waits forever: CaptureStream.start of wide hangs, at 3 s of virtual time.");
   }
 }
 

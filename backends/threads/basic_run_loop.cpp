@@ -13,7 +13,7 @@ class BasicRunLoop::Source final : public RunLoopSource {
     if (!signalled_.exchange(true)) waiter_->wake();
   }
   bool signalled() const { return signalled_.load(); }
-  // True when it was signalled; from here on it is not.
+  // Returns whether it was signalled, and resets the signal.
   bool take() { return signalled_.load() && signalled_.exchange(false); }
   void handle() const { handler_(); }
 
@@ -35,7 +35,7 @@ class BasicRunLoop::Observer final : public RunLoopObserver {
   const std::function<void(RunLoopActivities)> handler;
 };
 
-// A run within those that are going on. A stop that was meant for one of those is kept for it.
+// A nested run. Saves a stop that was meant for an outer run and restores it afterwards.
 class BasicRunLoop::Nesting {
  public:
   explicit Nesting(std::atomic<bool>& stopped) : stopped_(stopped), outer_(stopped.exchange(false)) {}
@@ -51,7 +51,7 @@ class BasicRunLoop::Nesting {
 BasicRunLoop::BasicRunLoop(std::shared_ptr<RunLoopWaiter> waiter) : waiter_(std::move(waiter)) {}
 
 BasicRunLoop::~BasicRunLoop() {
-  // Each mode is taken out before what it holds goes.
+  // Removes each mode from the map before its contents are destroyed, because their destructors may call the loop.
   while (!modes_.empty()) modes_.extract(modes_.begin());
 }
 
@@ -101,7 +101,7 @@ RunLoopResult BasicRunLoop::runInMode(std::string_view name, std::chrono::nanose
 }
 
 void BasicRunLoop::stop() {
-  const std::shared_ptr<RunLoopWaiter> waiter = waiter_;  // once the run has been stopped, the loop may be gone
+  const std::shared_ptr<RunLoopWaiter> waiter = waiter_;  // keeps the waiter alive: a stopped run may destroy the loop
   if (!stopped_.exchange(true)) waiter->wake();
 }
 
@@ -110,7 +110,7 @@ BasicRunLoop::Mode& BasicRunLoop::modeNamed(std::string_view name) {
   return found != modes_.end() ? found->second : modes_[std::string(name)];
 }
 
-// The default mode is all the common modes there are.
+// kRunLoopCommonModes contains only the default mode.
 BasicRunLoop::Mode& BasicRunLoop::modeToChange(std::string_view name) {
   return modeNamed(name == kRunLoopCommonModes ? kRunLoopDefaultMode : name);
 }
@@ -126,7 +126,7 @@ void BasicRunLoop::tell(Mode& mode, RunLoopActivities activity) {
       });
 }
 
-// True when at least one was handled.
+// True if at least one source was handled.
 bool BasicRunLoop::handleSources(Mode& mode) {
   if (!hasWork(mode)) return false;
   tell(mode, kRunLoopBeforeSources);

@@ -1,4 +1,4 @@
-// BasicRunLoop: what run loops do in whatever time they live: modes, sources, observers, runs within runs.
+// BasicRunLoop: run loops independent of the kind of time: modes, sources, observers and nested runs.
 #pragma once
 
 #include "backends/threads/ordered_members.h"
@@ -16,11 +16,11 @@
 
 namespace quazor {
 
-// How the thread of a loop waits, and how it is woken.
+// Blocks and wakes the thread of a loop.
 // Thread: the loop's, unless a function says otherwise.
 class RunLoopWaiter {
  public:
-  // A moment that never comes.
+  // A time that is never reached.
   static constexpr std::chrono::nanoseconds kNever = std::chrono::nanoseconds::max();
 
   RunLoopWaiter() = default;
@@ -28,30 +28,30 @@ class RunLoopWaiter {
   RunLoopWaiter& operator=(const RunLoopWaiter&) = delete;
   virtual ~RunLoopWaiter() = default;
 
-  // Time since some moment: not negative, and it never goes back.
+  // A monotonic, non-negative time.
   // Thread: the loop's.
   virtual std::chrono::nanoseconds now() = 0;
-  // Signals the sources of what has happened elsewhere, where nobody calls this process for it. Called at the beginning
-  // of every round of a run; it must not wait.
+  // Signals the sources of external events that do not notify this process. Called at the beginning of every round of a
+  // run; must not block.
   // Thread: the loop's.
   virtual void look() {}
-  // Sleeps until `ready` holds or now() has reached `deadline`.
+  // Blocks until `ready` returns true or now() reaches `deadline`.
   // Thread: the loop's.
   virtual void wait(std::chrono::nanoseconds deadline, const std::function<bool()>& ready) = 0;
-  // What another thread changed may have made `ready` hold: a wait that is going on asks it again.
+  // Called after another thread may have made `ready` true: a wait in progress checks it again.
   // Thread: any.
   virtual void wake() = 0;
 };
 
-// A run goes round: the sources that are signalled are handled; when the run is not to end then and nothing has been
-// signalled meanwhile, the thread waits. Every run goes round at least once.
+// Each round of a run handles the signalled sources. If the run does not end then and nothing was signalled in the
+// meantime, the thread waits. Every run has at least one round.
 //
-// Thread: as RunLoop says. A signal or a stop that ends a thread, and so its loop, may outlast it.
+// Thread: as in RunLoop. A call of signal() or stop() that ends a thread, and with it the loop, may outlast the loop.
 class BasicRunLoop final : public RunLoop {
  public:
   // `waiter` must not be null.
   explicit BasicRunLoop(std::shared_ptr<RunLoopWaiter> waiter);
-  // Lets go what is added; a handler that is destroyed may call the loop still.
+  // Destroys sources and observers. The destructor of a handler may still call the loop.
   ~BasicRunLoop() override;
 
   std::shared_ptr<RunLoopSource> makeSource(std::function<void()> handler) override;
@@ -61,7 +61,7 @@ class BasicRunLoop final : public RunLoop {
                                                 std::function<void(RunLoopActivities activity)> handler) override;
   void addObserver(const std::shared_ptr<RunLoopObserver>& observer, std::string_view mode) override;
   void removeObserver(const std::shared_ptr<RunLoopObserver>& observer, std::string_view mode) override;
-  // Lets through what a waiter throws; the loop can be run again afterwards.
+  // Passes on exceptions of the waiter; the loop can be run again afterwards.
   RunLoopResult runInMode(std::string_view mode, std::chrono::nanoseconds limit,
                           bool returnAfterSourceHandled) override;
   void stop() override;
@@ -85,8 +85,8 @@ class BasicRunLoop final : public RunLoop {
   void waitFor(Mode& mode, std::chrono::nanoseconds deadline);
 
   const std::shared_ptr<RunLoopWaiter> waiter_;
-  std::atomic<bool> stopped_{false};                // the innermost run; without a run it says nothing
-  std::map<std::string, Mode, std::less<>> modes_;  // a mode stays where it is as long as the loop
+  std::atomic<bool> stopped_{false};                // applies to the innermost run; meaningless without a run
+  std::map<std::string, Mode, std::less<>> modes_;  // modes are not removed before the loop is destroyed
   std::uint64_t additions_ = 0;
 };
 

@@ -1,4 +1,4 @@
-// What the conformance suites cannot bring about: a loop that goes while another thread is still about to wake it.
+// Cases that the conformance suites cannot produce: a loop is destroyed while another thread is about to wake it.
 #include "backends/threads/basic_run_loop.h"
 
 #include <gtest/gtest.h>
@@ -10,7 +10,7 @@
 namespace quazor {
 namespace {
 
-// Waking destroys the loop, as when its thread ends before the waking call has returned.
+// Waking destroys the loop, like a thread that ends before the waking call has returned.
 class LastWakeUp final : public RunLoopWaiter {
  public:
   LastWakeUp(std::unique_ptr<BasicRunLoop>& loop, bool& is_gone) : loop_(loop), is_gone_(is_gone) {}

@@ -1,4 +1,4 @@
-// What every implementation of Concurrency and Clock has to do, as a typed test suite.
+// Requirements on every implementation of Concurrency and Clock, as a typed test suite.
 //
 // A backend instantiates it with a type that has a default constructor and the members
 //
@@ -7,7 +7,7 @@
 //
 //   INSTANTIATE_TYPED_TEST_SUITE_P(Threads, ConcurrencyConformance, ThreadsUnderTest);
 //
-// The suite waits only through the services under test, so that it runs on one thread with virtual time too.
+// The suite waits only through the services under test, so it also runs on one thread in virtual time.
 #pragma once
 
 #include "platform/clock.h"
@@ -33,14 +33,14 @@ class ConcurrencyConformance : public ::testing::Test {
   Queue makeQueue() { return concurrency_->makeSerialQueue("org.quazor.conformance", QualityOfService::kDefault); }
   std::shared_ptr<Semaphore> makeSemaphore(long count = 0) { return concurrency_->makeSemaphore(count); }
 
-  // Returns when the queue has run what is waiting in it now.
+  // Waits until the queue has run all tasks that are pending now.
   void finish(SerialQueue& queue) {
     const auto done = makeSemaphore();
     queue.async([done] { done->signal(); });
     done->wait();
   }
 
-  // Gives others time until `condition` holds; false when it does not within seconds.
+  // Yields until `condition` is true; returns false after a few seconds.
   template <class Condition>
   bool eventually(Condition condition) {
     for (int i = 0; i < 300'000; ++i) {
@@ -50,9 +50,9 @@ class ConcurrencyConformance : public ::testing::Test {
     return false;
   }
 
-  // Runs `attempt` until it has taken no longer than `limit` between the two moments that it returns: on a busy machine
-  // a thread may lose its processor just there, and what becomes due meanwhile takes another turn. False when every
-  // attempt was too slow.
+  // Repeats `attempt` until no more than `limit` passes between the two times that it returns: on a busy machine a
+  // thread may be preempted at that point, which changes the order of due tasks. Returns false if every attempt was too
+  // slow.
   template <class Attempt>
   bool inTime(std::chrono::nanoseconds limit, Attempt attempt) {
     for (int i = 0; i < 500; ++i) {
@@ -67,7 +67,7 @@ class ConcurrencyConformance : public ::testing::Test {
   std::shared_ptr<Clock> clock_ = under_test_.clock();
 };
 
-// Runs a function when it is destroyed: part of a task, it tells when the task went.
+// Runs a function in its destructor: captured in a task, it reports the destruction of the task.
 class AtDestruction {
  public:
   template <class Function>
@@ -129,7 +129,7 @@ TYPED_TEST_P(ConcurrencyConformance, ATaskIsDestroyedBeforeTheNextStarts) {
   const auto queue = this->makeQueue();
   const auto gate = this->makeSemaphore();
   typename TestFixture::Words words;
-  queue->async([gate] { gate->wait(); });  // so that the next three wait together
+  queue->async([gate] { gate->wait(); });  // makes the next three wait at the same time
   for (const char* name : {"a", "b", "c"}) {
     queue->async([&words, name, guard = AtDestruction([&words, name] { words.push_back(std::string("-") + name); })] {
       words.push_back(std::string("+") + name);
@@ -206,7 +206,7 @@ TYPED_TEST_P(ConcurrencyConformance, DelayedTasksRunInTheOrderOfTheirDueTimes) {
   EXPECT_TRUE(this->inTime(std::chrono::microseconds(500), [&] {
     std::pair<std::chrono::nanoseconds, std::chrono::nanoseconds> posting;
     words.clear();
-    queue->async([&] {  // in one task, so that all are waiting before the first is due
+    queue->async([&] {  // one task posts all, before the first is due
       posting.first = this->clock_->now();
       queue->asyncAfter(std::chrono::microseconds(3000), [&] { done->signal(); });
       queue->asyncAfter(std::chrono::microseconds(2000), [&] { words.push_back("2"); });
@@ -227,7 +227,7 @@ TYPED_TEST_P(ConcurrencyConformance, AShorterDelayCutsTheWaitForALongerOneShort)
   const auto queue = this->makeQueue();
   const auto done = this->makeSemaphore();
   queue->asyncAfter(std::chrono::hours(1), [] {});
-  this->clock_->sleep(std::chrono::milliseconds(1));  // by now the queue waits for the long delay
+  this->clock_->sleep(std::chrono::milliseconds(1));  // by now the queue waits for the longer delay
   const auto posted = this->clock_->now();
   queue->asyncAfter(std::chrono::milliseconds(1), [done] { done->signal(); });
   done->wait();
@@ -337,7 +337,7 @@ TYPED_TEST_P(ConcurrencyConformance, ADelayThatPassesAfterTheQueueWasDroppedDoes
   const bool dropped_in_time = this->clock_->now() - posted < std::chrono::milliseconds(2);
   done->wait();
   done->wait();
-  EXPECT_FALSE(ran && dropped_in_time);  // on a busy machine the queue may have been dropped too late to tell
+  EXPECT_FALSE(ran && dropped_in_time);  // inconclusive if a busy machine dropped the queue too late
 }
 
 TYPED_TEST_P(ConcurrencyConformance, ATaskMayDropTheLastReferenceToItsOwnQueue) {

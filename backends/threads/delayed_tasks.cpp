@@ -22,7 +22,7 @@ void DelayedTasks::clear() {
     tasks.swap(tasks_);
     updateNextDue();
   }
-  // The tasks are destroyed here, outside the lock, because their destructors may do anything.
+  // The tasks are destroyed here, outside the lock, because their destructors may call anything.
 }
 
 void DelayedTasks::updateNextDue() {

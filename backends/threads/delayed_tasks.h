@@ -1,4 +1,4 @@
-// DelayedTasks: the tasks of a queue whose delay has not yet passed.
+// DelayedTasks: the tasks of a queue that are not yet due.
 #pragma once
 
 #include "platform/task.h"
@@ -15,26 +15,26 @@ namespace quazor {
 // Thread: any.
 class DelayedTasks {
  public:
-  // A due time that never comes.
+  // A due time that is never reached.
   static constexpr std::chrono::nanoseconds kNever = std::chrono::nanoseconds::max();
 
-  // Keeps a task until `due`. True when no other task is due before it. Tasks with one due time keep their order.
+  // Adds a task. Returns true if it is now the first to become due. Tasks with the same due time keep their order.
   bool add(std::chrono::nanoseconds due, Task task);
 
-  // The earliest due time, or kNever. One load: what a thread added itself, or learnt of, it sees.
+  // The earliest due time, or kNever. A single atomic load: a thread sees tasks that it added or was informed of.
   std::chrono::nanoseconds nextDue() const {
     return std::chrono::nanoseconds(next_due_.load(std::memory_order_relaxed));
   }
 
-  // Hands the tasks that are due at `now` to `post`, in the order of their due times. True when there was one. Calls do
-  // not overlap: a thread that comes second waits until the first has posted what was due.
+  // Passes the tasks that are due at `now` to `post`, in the order of their due times. Returns true if there was one.
+  // Calls are serialized: a second caller waits until the first has posted the due tasks.
   template <class Post>
   bool postDue(std::chrono::nanoseconds now, Post&& post);
 
-  // Lets no task become due any more.
+  // No task becomes due after this.
   void close();
 
-  // Destroys the tasks that are kept, one after another.
+  // Destroys the remaining tasks one by one.
   void clear();
 
  private:

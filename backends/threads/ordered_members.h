@@ -1,4 +1,4 @@
-// OrderedMembers: what was added to something, in order, visited while visitors add and remove.
+// OrderedMembers: an ordered set of items that may change while it is visited.
 #pragma once
 
 #include <algorithm>
@@ -10,41 +10,41 @@
 
 namespace quazor {
 
-// Holds each item once. Items of a lower rank stand first, equal ones as they were added.
+// Contains each item once, ordered by rank and then by insertion.
 //
-// Thread: one at a time. An item that is let go is destroyed when the members are in order again, so its destructor may
-// call everything here.
+// Thread: one at a time. A removed item is destroyed after the order has been restored, so its destructor may call all
+// of these functions.
 template <class Item>
 class OrderedMembers {
  public:
   bool empty() const { return members_.empty(); }
 
-  // Adds `item`, which must not be null. Without effect when it is there. `number` says when it was added: it is higher
-  // at every call.
+  // Adds `item`, which must not be null. Does nothing if it is already present. `number` gives the order of insertion
+  // and must increase with every call.
   void add(std::shared_ptr<Item> item, std::int64_t rank, std::uint64_t number) {
     if (find(item.get()) != members_.end()) return;
     const Place place{rank, number};
     members_.insert(firstBehind(place), Member{place, std::move(item)});
   }
 
-  // Without effect when it is not there.
+  // Does nothing if the item is not present.
   void remove(const Item* item) {
     const auto found = find(item);
     if (found == members_.end()) return;
-    const std::shared_ptr<Item> held = std::move(found->item);  // until the end of this call
+    const std::shared_ptr<Item> held = std::move(found->item);  // destroyed at the end of this call
     members_.erase(found);
   }
 
-  // True when `condition` holds for one of them. It must not add or remove.
+  // True if `condition` holds for one of the items. It must not add or remove.
   template <class Condition>
   bool anyOf(Condition condition) const {
     return std::any_of(members_.begin(), members_.end(),
                        [&condition](const Member& member) { return condition(*member.item); });
   }
 
-  // Calls `act(item)`, in order, for each that `wanted(item)` accepts when its turn comes. `act` may add and remove:
-  // what is removed before its turn is passed over, and so is what was added with a higher number than `newest`. The
-  // item lives until `act` has returned. `wanted` must not add or remove.
+  // Calls `act(item)`, in order, for each item that `wanted(item)` accepts at its turn. `act` may add and remove: skips
+  // items that were removed before their turn and items added with a number above `newest`. An item lives until `act`
+  // has returned. `wanted` must not add or remove.
   template <class Condition, class Action>
   void visit(std::uint64_t newest, Condition wanted, Action act) {
     auto next = members_.begin();
@@ -58,7 +58,7 @@ class OrderedMembers {
         const std::shared_ptr<Item> item = next->item;
         act(item);
       }
-      // Only now that the item may have gone too: its destructor may have added or removed others.
+      // Must follow the release of the item, whose destructor may add or remove others.
       next = firstBehind(place);
     }
   }
@@ -84,7 +84,7 @@ class OrderedMembers {
                             [](const Place& wanted, const Member& member) { return wanted < member.place; });
   }
 
-  std::vector<Member> members_;  // sorted by their places
+  std::vector<Member> members_;  // sorted by place
 };
 
 }  // namespace quazor

@@ -107,7 +107,7 @@ TEST_F(OrderedMembersTest, AnyOfAsksEachUntilOneIsFound) {
   EXPECT_FALSE(members_.anyOf([](const Item& item) { return item == "c"; }));
 }
 
-// Removes another from the members when it is destroyed.
+// Removes another item when it is destroyed.
 struct Remover {
   Remover(OrderedMembers<Remover>& all, std::shared_ptr<Remover> other) : members(all), removed(std::move(other)) {}
   Remover(const Remover&) = delete;

@@ -22,8 +22,8 @@ void Parker::park(std::chrono::nanoseconds deadline) {
     timeout = &absolute;
   }
   if (woken_.load(std::memory_order_acquire) != 0) return;
-  // FUTEX_WAIT_BITSET is the form whose timeout is a moment of the steady clock. It returns at once when the word is
-  // no longer 0.
+  // The timeout of FUTEX_WAIT_BITSET is an absolute time of the steady clock. The call returns at once if the word is
+  // not 0.
   syscall(SYS_futex, &woken_, FUTEX_WAIT_BITSET | FUTEX_PRIVATE_FLAG, 0, timeout, nullptr, FUTEX_BITSET_MATCH_ANY);
 }
 

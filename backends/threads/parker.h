@@ -1,4 +1,4 @@
-// Parker: where one thread sleeps until another thread, or the clock, wakes it.
+// Parker: blocks one thread until another thread or the clock wakes it.
 #pragma once
 
 #include <atomic>
@@ -7,17 +7,17 @@
 
 namespace quazor {
 
-// One thread sleeps here; any thread wakes it. The sleeper prepares, then makes known that it will sleep, then parks:
-// a wake-up that falls between is not lost.
-// Thread: the sleeper's, but for unpark(): any.
+// One thread sleeps, any thread wakes it. The sleeper calls prepare(), then announces that it will sleep, then calls
+// park(). A wake-up in between is not lost.
+// Thread: the sleeper's, except unpark(): any.
 class Parker {
  public:
-  // Forgets the wake-ups so far.
+  // Discards earlier wake-ups.
   // Thread: the sleeper.
   void prepare() { woken_.store(0, std::memory_order_relaxed); }
 
-  // Sleeps until unpark, or until the steady clock reads `deadline`; the largest value means for ever. May return
-  // early: the caller looks again at what it waits for.
+  // Blocks until unpark() or until the steady clock reaches `deadline`; the largest value means no deadline. May return
+  // early: the caller must check its condition again.
   // Thread: the sleeper.
   void park(std::chrono::nanoseconds deadline);
 

@@ -11,7 +11,7 @@ Date RealClock::date() const {
 }
 
 void RealClock::sleep(std::chrono::nanoseconds duration) {
-  // For a duration, not until a moment: now plus a huge duration would wrap into the past.
+  // Sleeps for a duration, not until a time: the sum of now and a huge duration would overflow.
   std::this_thread::sleep_for(duration);
 }
 

@@ -1,4 +1,4 @@
-// RealClock: the machine's own time.
+// RealClock: the clocks of the machine.
 #pragma once
 
 #include "platform/clock.h"
@@ -13,9 +13,9 @@ class RealClock final : public Clock {
  public:
   // The steady clock.
   std::chrono::nanoseconds now() const override;
-  // The system clock, to the precision it has.
+  // The system clock, at full precision.
   Date date() const override;
-  // A duration that the clock does not reach blocks for ever.
+  // Blocks forever if the duration exceeds the range of the clock.
   void sleep(std::chrono::nanoseconds duration) override;
 };
 

@@ -30,7 +30,7 @@ TEST(RealClockTest, ASleepBeyondTheClocksRangeDoesNotReturn) {
     std::thread([returned, duration] {
       RealClock().sleep(duration);
       ++*returned;
-    }).detach();  // it sleeps on until the process ends
+    }).detach();  // sleeps until the process ends
   }
   RealClock().sleep(std::chrono::milliseconds(5));
   EXPECT_EQ(*returned, 0);

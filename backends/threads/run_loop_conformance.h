@@ -1,4 +1,4 @@
-// What every run loop has to do with its sources, its limits and its stops, as a typed test suite.
+// Requirements on the sources, limits and stops of every run loop, as a typed test suite.
 #pragma once
 
 #include "backends/threads/run_loop_fixture.h"
@@ -19,7 +19,7 @@ TYPED_TEST_P(RunLoopConformance, AThreadHasTheSameLoopAtEveryCall) {
 }
 
 TYPED_TEST_P(RunLoopConformance, OfTheReasonsToEndTheFirstOfTheListIsTheResult) {
-  // Every set of reasons but the empty one, with which the run would not end.
+  // Every set of reasons except the empty one, with which the run would not end.
   for (unsigned reasons = 1; reasons < 16; ++reasons) {
     const bool handled = (reasons & 1) != 0;
     const bool timed_out = (reasons & 2) != 0;
@@ -240,7 +240,7 @@ TYPED_TEST_P(RunLoopConformance, ARunIsFinishedWhenItsLastSourceIsRemoved) {
   typename TestFixture::Source last;
   last = this->addSource([&] { this->loop_.removeSource(last, TestFixture::kDefault); });
   last->signal();
-  EXPECT_EQ(this->run(std::chrono::milliseconds(1)), RunLoopResult::kTimedOut);  // the idle one is left
+  EXPECT_EQ(this->run(std::chrono::milliseconds(1)), RunLoopResult::kTimedOut);  // only the idle source is left
   this->loop_.addSource(last, TestFixture::kDefault);
   this->loop_.removeSource(idle, TestFixture::kDefault);
   last->signal();

@@ -1,4 +1,4 @@
-// The fixture that the run loops' conformance suites share.
+// The fixture shared by the conformance suites for run loops.
 //
 // A backend instantiates the suites with a type that has a default constructor and the members
 //
@@ -8,8 +8,7 @@
 //
 //   INSTANTIATE_TYPED_TEST_SUITE_P(Threads, RunLoopConformance, ThreadsUnderTest);
 //
-// The suites wait only through the loop and the services under test, so that they run on one thread with virtual time
-// too.
+// The suites wait only through the loop and the services under test, so they also run on one thread in virtual time.
 #pragma once
 
 #include "platform/clock.h"
@@ -48,10 +47,10 @@ class RunLoopFixture : public ::testing::Test {
 
   static constexpr std::string_view kDefault = kRunLoopDefaultMode;
   static constexpr std::string_view kOther = "org.quazor.other";
-  // So long that a run that should have ended before is told by its result.
+  // Long enough that a run which does not end early is visible in its result.
   static constexpr std::chrono::seconds kLong{10};
 
-  // A thread may keep its loop for longer than one test.
+  // Removes everything, because a thread may keep its loop for longer than one test.
   ~RunLoopFixture() override {
     for (const std::string_view mode : {kDefault, kOther}) {
       for (const std::weak_ptr<RunLoopSource>& source : sources_) {
@@ -63,7 +62,7 @@ class RunLoopFixture : public ::testing::Test {
     }
   }
 
-  // A source that is not added.
+  // A source that is not added to the loop.
   Source makeSource(std::function<void()> handler) {
     Source source = loop_.makeSource(std::move(handler));
     sources_.push_back(source);
@@ -74,11 +73,11 @@ class RunLoopFixture : public ::testing::Test {
     loop_.addSource(source, mode);
     return source;
   }
-  // Its handling is a word.
+  // Adds a source whose handler records the word.
   Source addWord(const std::string& word, std::string_view mode = kDefault) {
     return addSource([this, word] { words_.push_back(word); }, mode);
   }
-  // Keeps the mode from having no sources.
+  // Adds a source that is never signalled: a mode without sources does not wait.
   Source addIdleSource(std::string_view mode = kDefault) {
     return addSource([] { ADD_FAILURE() << "a source was handled without a signal"; }, mode);
   }
@@ -95,7 +94,7 @@ class RunLoopFixture : public ::testing::Test {
     loop_.addObserver(observer, mode);
     return observer;
   }
-  // Each activity that it is told of is a word.
+  // Adds an observer that records the name of each activity.
   Observer addWitness(RunLoopActivities activities = kRunLoopAllActivities, const std::string& prefix = "",
                       bool repeats = true, std::int64_t order = 0, std::string_view mode = kDefault) {
     return addObserver(
@@ -107,10 +106,10 @@ class RunLoopFixture : public ::testing::Test {
                     std::string_view mode = kDefault) {
     return loop_.runInMode(mode, limit, returnAfterSourceHandled);
   }
-  // Handles what is signalled and does not wait.
+  // Handles the signalled sources without waiting.
   void runOnce(std::string_view mode = kDefault) { run(std::chrono::nanoseconds::zero(), false, mode); }
 
-  // Runs the function soon, elsewhere than on the loop's thread.
+  // Runs the function soon, outside the loop's thread.
   void elsewhere(std::function<void()> function) {
     queue_->asyncAfter(std::chrono::milliseconds(1), [work = std::move(function)] { work(); });
   }
@@ -129,7 +128,7 @@ class RunLoopFixture : public ::testing::Test {
   std::vector<std::weak_ptr<RunLoopObserver>> observers_;
 };
 
-// Part of a handler, it tells when the handler is destroyed.
+// Captured in a handler, it reports the destruction of the handler.
 inline std::shared_ptr<void> atDestruction(std::function<void()> function) {
   return std::shared_ptr<void>(nullptr, [call = std::move(function)](void*) { call(); });
 }

@@ -1,4 +1,4 @@
-// What every run loop has to tell its observers, as a typed test suite.
+// Requirements on the notifications of observers by every run loop, as a typed test suite.
 #pragma once
 
 #include "backends/threads/run_loop_fixture.h"
@@ -153,7 +153,7 @@ TYPED_TEST_P(RunLoopObserverConformance, OneThatDoesNotRepeatIsRemovedBeforeItIs
   observer = this->addObserver(
       kRunLoopEntry,
       [&](RunLoopActivities) {
-        if (++times == 1) this->runOnce();  // nobody is told of this one's entry
+        if (++times == 1) this->runOnce();  // no observer is notified of this entry
         if (times == 1) this->loop_.addObserver(observer, TestFixture::kDefault);
       },
       false);

@@ -1,5 +1,5 @@
-// Signals and stops against waits and the ends of runs, at random moments, from a fixed seed, as a typed test suite for
-// the loops of real threads. Meant to be run under the thread sanitizer too.
+// Signals and stops concurrent with waits and ends of runs, at pseudo-random times from a fixed seed, as a typed test
+// suite for loops of real threads. Also run it under the thread sanitizer.
 //
 // A backend instantiates it with a type that has a default constructor and the member
 //
@@ -37,7 +37,7 @@ class RunLoopStress : public ::testing::Test {
 
 TYPED_TEST_SUITE_P(RunLoopStress);
 
-// Keeps the processor for up to `most`, so that what follows comes at no particular moment.
+// Spins for a random time of up to `most`.
 inline void delay(std::minstd_rand& random, std::chrono::nanoseconds most) {
   const auto end =
       std::chrono::steady_clock::now() + std::chrono::nanoseconds(random() % static_cast<unsigned>(most.count()));
@@ -45,7 +45,7 @@ inline void delay(std::minstd_rand& random, std::chrono::nanoseconds most) {
   }
 }
 
-// A thread that does the same once in each round.
+// A thread that performs the same action once per round.
 class StressHelper {
  public:
   StressHelper(unsigned seed, std::function<void(int round)> act)
@@ -79,12 +79,12 @@ class StressHelper {
   std::thread thread_;
 };
 
-// In a round, a run is signalled, stopped or both by other threads, which begin when the run has.
+// In each round other threads, started together with a run, signal it, stop it or both.
 TYPED_TEST_P(RunLoopStress, NoSignalAndNoStopIsLostHoweverItMeetsTheWaitOrTheEndOfARun) {
   enum class Race { kStop, kSignal, kBothAgainstTheLimit };
   const int rounds = TestFixture::isThorough() ? 1'000'000 : 20'000;
   RunLoop& loop = TestFixture::currentLoop();
-  int message = 0;  // from the signaller to the handler, without any synchronisation but the loop's
+  int message = 0;  // passed from the signaller to the handler, synchronised only by the loop
   int handled = 0;
   const auto source = loop.makeSource([&] { handled = message; });
   loop.addSource(source, TestFixture::kMode);
@@ -116,7 +116,7 @@ TYPED_TEST_P(RunLoopStress, NoSignalAndNoStopIsLostHoweverItMeetsTheWaitOrTheEnd
     if (race == Race::kSignal && result != RunLoopResult::kHandledSource) ++wrong;
     signaller.waitForEndOf(signals);
     stopper.waitForEndOf(stops);
-    if (is_against_limit && result != RunLoopResult::kHandledSource) {  // the signal is still to be handled
+    if (is_against_limit && result != RunLoopResult::kHandledSource) {  // the signal is still pending
       if (loop.runInMode(TestFixture::kMode, std::chrono::seconds(0), true) != RunLoopResult::kHandledSource) ++wrong;
     }
     if (handled != signals) ++wrong;

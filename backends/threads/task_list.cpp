@@ -15,7 +15,7 @@ void Backoff::pause() {
   } else if (pauses_ <= kPolls + kYields) {
     std::this_thread::yield();
   } else {
-    // A thread of lower priority gets no time from one that only yields.
+    // A yield alone would not give time to a thread of lower priority.
     std::this_thread::sleep_for(std::chrono::microseconds(50));
   }
 }
@@ -52,7 +52,7 @@ void TaskList::linkNextSegment(Segment* full) {
   Segment* next = spares_.take();
   if (next == nullptr) next = new Segment;
   full->next = next;
-  // An exchange and not a store: what endSleep made visible stays so along a chain of exchanges.
+  // An exchange instead of a store continues the release sequence of endSleep().
   tail_.exchange(reinterpret_cast<std::uintptr_t>(next), std::memory_order_acq_rel);
 }
 

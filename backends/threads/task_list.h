@@ -1,24 +1,23 @@
-// TaskList: the first-in first-out list between the threads that post tasks and the one thread that runs them.
+// TaskList: a first-in first-out list from the threads that post tasks to the one thread that runs them.
 //
-// Tasks lie in place in slots of one cache line each; slots lie in segments; segments are linked from the oldest to
-// the newest. One word, the tail, holds the newest segment, the number of its slots that are claimed, and whether the
+// Tasks are stored in slots of one cache line each. Slots are grouped in segments, which are linked from the oldest to
+// the newest. One word, the tail, contains the newest segment, the number of its claimed slots, and whether the
 // consumer sleeps:
 //
 //   [ address of a segment | claimed slots, 0 to kSlots | asleep ]
 //
-// 1. A producer claims a slot by raising the count with one compare-and-exchange. No other thread touches a claimed
-//    slot, and its segment stays, until the slot has been published and consumed: a claim needs no other protection.
-// 2. It moves its task there and publishes the slot through the slot's own flag. The consumer takes slots in the order
-//    of the claims, so it waits at a slot that is claimed and not yet published.
-// 3. The thread that claims the last slot of a segment links the next segment and moves the tail there before
-// publishing the
-//    slot. So the consumer finds a link behind every last slot. Other producers wait for the tail meanwhile.
-// 4. The consumer goes to sleep by setting the asleep bit, and only while the tail is where the consumer is: nothing
-//    is claimed then. The claim that follows clears the bit, and so learns, from the same instruction, that there is
-//    somebody to wake. A producer that finds the consumer awake does one atomic instruction and no system call.
-// 5. A segment whose slots are all consumed becomes a spare, from which the next link is made. The consumer frees, from
-//    time to time, the spares that were not needed since the last time. So memory follows the number of waiting tasks,
-//    and a list that is as busy as it was before allocates nothing.
+// 1. A producer claims a slot by incrementing the count with a compare-and-exchange. No other thread accesses a claimed
+//    slot or reuses its segment until the slot has been published and consumed, so it needs no other protection.
+// 2. The producer moves its task there and publishes the slot with the slot's own flag. The consumer takes slots in the
+//    order of the claims, so it waits for a slot that is claimed but not yet published.
+// 3. The thread that claims the last slot of a segment links the next segment and moves the tail there before it
+//    publishes the slot. The consumer therefore finds a link after every last slot. Other producers wait for the tail.
+// 4. The consumer goes to sleep by setting the asleep bit, which succeeds only if the tail is at the consumer's slot:
+//    nothing is claimed then. The next claim clears the bit, and the same instruction reveals that the consumer must be
+//    woken. If the consumer is awake, a producer needs one atomic instruction and no system call.
+// 5. A segment whose slots are all consumed becomes a spare, to be linked again later. Periodically, the consumer frees
+//    the spares that were not needed since the last time. Memory use follows the number of pending tasks, and a list
+//    under constant load does not allocate.
 #pragma once
 
 #include "platform/task.h"
@@ -34,7 +33,7 @@ namespace quazor {
 
 inline constexpr std::size_t kCacheLine = 64;
 
-// A short pause in a loop that polls memory which another thread is about to write.
+// A short pause in a loop that polls memory.
 inline void cpuRelax() {
 #if defined(__x86_64__) || defined(__i386__)
   __builtin_ia32_pause();
@@ -43,8 +42,8 @@ inline void cpuRelax() {
 #endif
 }
 
-// Waits for another thread that is between two instructions, most likely on another processor: polls at first, and
-// gives the processor away when the other thread has evidently lost its own.
+// Waits for another thread that is between two instructions, probably on another processor. Polls at first, and yields
+// the processor if the other thread seems to have lost its own.
 // Thread: one at a time.
 class Backoff {
  public:
@@ -55,41 +54,41 @@ class Backoff {
 };
 
 // Any number of producers, one consumer.
-// Thread: any for push(); all else the one consumer's.
+// Thread: any for push(); the consumer's for all other functions.
 class TaskList {
  public:
   TaskList();
   TaskList(const TaskList&) = delete;
   TaskList& operator=(const TaskList&) = delete;
-  // Destroys the tasks that are left. No other thread may be inside.
+  // Destroys the remaining tasks. No other thread may use the list.
   ~TaskList();
 
-  // Appends a task. True when this ended the consumer's sleep: the caller must wake it. Without memory the process
-  // ends: a place that is claimed and never filled would hold up all that follow. Thread: any.
+  // Appends a task. Returns true if this ended the consumer's sleep: the caller must wake it. The process ends if there
+  // is no memory, because a claimed slot that is never filled would block the list. Thread: any.
   [[nodiscard]] bool push(Task&& task) noexcept;
 
-  // Ends the consumer's sleep without a task. True when it slept: the caller must wake it. What the caller wrote before
-  // is seen by the consumer after its next beginSleep.
+  // Ends the consumer's sleep without a task. Returns true if it slept: the caller must wake it. The consumer sees the
+  // caller's earlier writes after its next beginSleep().
   // Thread: any.
   [[nodiscard]] bool endSleep() { return (tail_.fetch_and(~kAsleep, std::memory_order_acq_rel) & kAsleep) != 0; }
 
-  // The oldest task, or null when none has been published. It stays in place while it runs.
+  // The oldest task, or null if none has been published. It is not moved while it runs.
   // Thread: the consumer.
   Task* front();
 
-  // Destroys the oldest task. REQUIRES: front() has shown it.
+  // Destroys the oldest task. REQUIRES: front() has returned it.
   // Thread: the consumer.
   void pop();
 
-  // Announces that the consumer is about to sleep. False when a task has been claimed, and is or will be published.
-  // REQUIRES: front() has shown nothing.
+  // Announces that the consumer is about to sleep. Returns false if a task has been claimed, published or not.
+  // REQUIRES: front() has returned null.
   // Thread: the consumer.
   [[nodiscard]] bool beginSleep();
 
-  // True when memory is kept that no task lies in, beyond the segment in use.
+  // True if memory beyond the segment in use is kept without a task in it.
   // Thread: the consumer.
   bool hasSpares();
-  // Frees what was not needed since the last call.
+  // Frees the spares that were not needed since the last call.
   // Thread: the consumer.
   void freeUnneededSpares();
 
@@ -117,21 +116,21 @@ class TaskList {
 
   struct alignas(kSegmentAlignment) Segment {
     Slot slots[kSlots];
-    Segment* next = nullptr;  // written before the last slot is published, read after
+    Segment* next = nullptr;  // written before the last slot is published, read afterwards
   };
 
-  // Segments without tasks, linked through their `next`. The one used last is used first: it may still be in the cache.
+  // Segments without tasks, linked through `next`. Last in, first out: the most recent is likely still in the cache.
   class Spares {
    public:
     ~Spares();
     void put(Segment* segment);
-    // Null when there is none.
+    // Null if there is none.
     Segment* take();
     bool empty();
     void freeUnneeded();
 
    private:
-    std::mutex mutex_;          // taken once for each segment, twice in its life
+    std::mutex mutex_;          // locked once per segment, twice in its lifetime
     Segment* first_ = nullptr;  // guarded by mutex_, as all that follows
     std::size_t count_ = 0;
     std::size_t unneeded_ = 0;  // the lowest count since freeUnneeded
@@ -139,15 +138,15 @@ class TaskList {
 
   // NOLINTNEXTLINE(performance-no-int-to-ptr): a tail is a segment's address and, in its lower bits, a count
   static Segment* segmentOf(std::uintptr_t tail) { return reinterpret_cast<Segment*>(tail & ~(kSegmentAlignment - 1)); }
-  // Claims a slot; returns the tail as it was before.
+  // Claims a slot and returns the previous value of the tail.
   std::uintptr_t claim();
   std::uintptr_t awaitNextSegment() const;
   void linkNextSegment(Segment* full);
 
-  // Written by the producers.
+  // Written by producers.
   alignas(kCacheLine) std::atomic<std::uintptr_t> tail_;
   alignas(kCacheLine) Spares spares_;
-  // The consumer's own: the slot that it consumes next.
+  // Used only by the consumer: the slot that it consumes next.
   alignas(kCacheLine) Segment* head_;
   std::size_t consumed_ = 0;  // slots of head_; always below kSlots
 };

@@ -12,7 +12,7 @@
 namespace quazor {
 namespace {
 
-// Runs and removes the oldest task; false when there is none.
+// Runs and removes the oldest task; false if there is none.
 bool runOne(TaskList& list) {
   Task* const task = list.front();
   if (task == nullptr) return false;
@@ -31,7 +31,7 @@ TEST(TaskListTest, KeepsTheOrderAcrossSegments) {
   std::vector<int> ran;
   std::vector<int> expected;
   int pushed = 0;
-  // Bursts of every size up to several segments, so that their ends fall everywhere.
+  // Bursts of all sizes up to several segments, so that they end at every position.
   for (int burst = 1; burst < 300; ++burst) {
     for (int i = 0; i < burst; ++i, ++pushed) {
       expected.push_back(pushed);
@@ -68,7 +68,7 @@ TEST(TaskListTest, DestroysTheTasksThatAreLeft) {
 
 TEST(TaskListTest, TheFirstTaskAfterTheSleepBeganSaysSo) {
   TaskList list;
-  for (int round = 0; round < 300; ++round) {  // at every place of a segment
+  for (int round = 0; round < 300; ++round) {  // at every position in a segment
     ASSERT_TRUE(list.beginSleep());
     EXPECT_TRUE(list.push([] {}));
     EXPECT_FALSE(list.push([] {}));
@@ -122,7 +122,7 @@ TEST(TaskListTest, ATaskMayPushWhileItRunsAndWhileItIsDestroyed) {
   EXPECT_EQ(ran, 600);
 }
 
-// Lets so many tasks wait at one time that they lie in `segments` segments beyond the first, and runs them.
+// Queues enough tasks at once to fill `segments` segments beyond the first, then runs them.
 void fillAndRun(TaskList& list, int segments) {
   for (int i = 0; i < 127 * segments; ++i) EXPECT_FALSE(list.push([] {}));
   while (runOne(list)) {

@@ -12,7 +12,7 @@ namespace quazor {
 // Thread: any.
 class ThreadConcurrency final : public Concurrency {
  public:
-  // A ThreadSerialQueue. A process that can have no more threads is ended, as one without memory is.
+  // A ThreadSerialQueue. Ends the process if the system cannot create a thread, as for lack of memory.
   std::shared_ptr<SerialQueue> makeSerialQueue(std::string_view label, QualityOfService quality) noexcept override;
   // A ThreadSemaphore.
   std::shared_ptr<Semaphore> makeSemaphore(long count) override;

@@ -22,7 +22,7 @@ class ThreadWaiter final : public RunLoopWaiter {
       return;
     for (;;) {
       parker_.prepare();
-      // A thread that changes the condition and finds no sleeper did so before `ready` is called here.
+      // A thread that changes the condition without seeing a sleeper did so before the following call of `ready`.
       asleep_.store(true);
       if (ready() || (deadline != kNever && now() >= deadline)) break;
       parker_.park(deadline);

@@ -107,7 +107,7 @@ TEST(ThreadRunLoopTest, AThreadThatWaitsUsesLessThanAThousandthOfAProcessor) {
   RunLoop& loop = currentLoop();
   const auto source = loop.makeSource([] {});
   loop.addSource(source, kRunLoopDefaultMode);
-  // On a busy machine a wake-up may cost much; a loop that polls uses too much every time.
+  // On a busy machine one wake-up may be expensive, but a loop that polls is always expensive.
   std::chrono::nanoseconds least = kWait;
   for (int attempt = 0; attempt < 25 && least >= kWait / 1000; ++attempt) {
     const auto before = processorTimeOfThisThread();

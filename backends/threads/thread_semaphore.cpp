@@ -5,7 +5,7 @@ namespace quazor {
 void ThreadSemaphore::signal() {
   const std::lock_guard lock(mutex_);
   ++count_;
-  // Under the lock: without it the woken thread could destroy the condition before it has been notified.
+  // Notifies under the lock: otherwise the woken thread could destroy the condition variable too early.
   above_zero_.notify_one();
 }
 

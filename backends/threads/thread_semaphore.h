@@ -8,13 +8,13 @@
 
 namespace quazor {
 
-// With a count below zero, as many signals more are needed before a wait returns.
+// If the count is negative, that many additional signals are needed before a wait returns.
 // Thread: any.
 class ThreadSemaphore final : public Semaphore {
  public:
   explicit ThreadSemaphore(long count) : count_(count) {}
 
-  // The last reference may go as soon as a wait returns, even while the signal that ended it is still returning.
+  // The last reference may be released as soon as a wait returns, even before this call has returned.
   void signal() override;
   void wait() override;
 

@@ -21,40 +21,40 @@ namespace {
 
 std::chrono::nanoseconds steadyNow() { return std::chrono::steady_clock::now().time_since_epoch(); }
 
-// At most a tick behind steadyNow(), and a fraction of its price. Both read the same clock (clock_gettime(2)).
+// At most one tick behind steadyNow(), and much cheaper. Both read the same clock (clock_gettime(2)).
 std::chrono::nanoseconds coarseNow() {
   timespec time{};
   clock_gettime(CLOCK_MONOTONIC_COARSE, &time);
   return std::chrono::seconds(time.tv_sec) + std::chrono::nanoseconds(time.tv_nsec);
 }
 
-// The moment `delay` from now, or never when the clock does not reach that far.
+// The time `delay` from now, or never if it exceeds the range of the clock.
 std::chrono::nanoseconds dueAfter(std::chrono::nanoseconds delay) {
   const std::chrono::nanoseconds now = steadyNow();
   return delay > DelayedTasks::kNever - now ? DelayedTasks::kNever : now + delay;
 }
 
 void nameThisThread(const std::string& label) {
-  constexpr std::size_t kMaxNameLength = 15;  // pthread_setname_np(3): 16 bytes with the closing null
+  constexpr std::size_t kMaxNameLength = 15;  // pthread_setname_np(3): 16 bytes including the null
   const std::size_t surplus = label.size() > kMaxNameLength ? label.size() - kMaxNameLength : 0;
   pthread_setname_np(pthread_self(), label.c_str() + surplus);
 }
 
 void lowerPriorityOfThisThread() {
   constexpr int kBackgroundNice = 10;
-  // Linux keeps a nice value for each thread, and 0 is the calling one (setpriority(2), "C library/kernel
+  // On Linux each thread has its own nice value, and 0 means the calling thread (setpriority(2), "C library/kernel
   // differences").
   setpriority(PRIO_PROCESS, 0, kBackgroundNice);
 }
 
 }  // namespace
 
-// What the queue and its thread share. The thread holds it until its end.
+// The state shared by the queue and its thread. The thread keeps it until the thread ends.
 class ThreadSerialQueue::Worker {
  public:
-  // Any thread that holds the queue.
+  // Thread: any that holds the queue.
   void post(Task&& task) {
-    // A thread that posts after a delayed task has become due posts the delayed task first.
+    // Keeps the order: delayed tasks that have become due precede the new task.
     if (delayed_.nextDue() != DelayedTasks::kNever) [[unlikely]]
       postDue();
     push(std::move(task));
@@ -62,10 +62,10 @@ class ThreadSerialQueue::Worker {
 
   void postAfter(std::chrono::nanoseconds delay, Task&& task) {
     if (!delayed_.add(dueAfter(delay), std::move(task))) return;
-    if (tasks_.endSleep()) parker_.unpark();  // the thread sleeps until a later moment
+    if (tasks_.endSleep()) parker_.unpark();  // the thread sleeps until a later due time
   }
 
-  // The queue is being destroyed, so no other thread posts any more.
+  // The queue is being destroyed, so there are no other callers.
   void close() {
     postDue();
     delayed_.close();
@@ -73,7 +73,7 @@ class ThreadSerialQueue::Worker {
     if (tasks_.endSleep()) parker_.unpark();
   }
 
-  // The thread's life.
+  // The thread's main function.
   void run() {
     while (!closed_.load(std::memory_order_acquire)) {
       if (!runWaiting() && !postDue() && !poll()) sleep();
@@ -83,13 +83,13 @@ class ThreadSerialQueue::Worker {
   }
 
  private:
-  // About five microseconds: as long as a sleep and a wake-up take.
+  // About five microseconds, the cost of a sleep and a wake-up.
   static constexpr int kPolls = 200;
-  // So few that they cost nothing, and enough to notice that the next task comes soon again.
+  // Few enough to be cheap, enough to notice that tasks arrive quickly again.
   static constexpr int kMinPolls = 10;
   // Kernels tick at least 100 times a second.
   static constexpr std::chrono::nanoseconds kMaxTick = std::chrono::milliseconds(10);
-  // Memory that was of no use for so long is given back.
+  // Memory that was not needed for this long is freed.
   static constexpr std::chrono::nanoseconds kMemoryPeriod = std::chrono::milliseconds(100);
 
   void push(Task&& task) {
@@ -115,8 +115,8 @@ class ThreadSerialQueue::Worker {
     return true;
   }
 
-  // Watches for a task for a short time. True when one has come. Watches the shorter the more often it was in vain: the
-  // next task is far off then, or the thread that is to post it waits for this very processor.
+  // Polls briefly for a task and returns whether one has arrived. Polls less after each failure: the next task is then
+  // far off, or the thread that would post it is waiting for this processor.
   bool poll() {
     for (int i = 0; i < polls_; ++i) {
       cpuRelax();
@@ -132,18 +132,18 @@ class ThreadSerialQueue::Worker {
   void sleep() {
     parker_.prepare();
     if (!tasks_.beginSleep()) {
-      // A task is on its way: its thread has claimed a place and not yet filled it.
+      // A thread has claimed a slot but not yet filled it.
       Backoff backoff;
       while (tasks_.front() == nullptr) backoff.pause();
       return;
     }
-    // From here on every post, every earlier due time and the end of the queue wakes this thread; what came before is
-    // visible to it.
+    // From here on every post, every earlier due time and the end of the queue wakes this thread; all earlier changes
+    // are visible to it.
     if (!closed_.load(std::memory_order_acquire)) parker_.park(std::min(delayed_.nextDue(), tidyMemory()));
     static_cast<void>(tasks_.endSleep());
   }
 
-  // Gives memory back when it is time to. Returns when it will be time again.
+  // Frees memory periodically. Returns the time at which it is due again.
   std::chrono::nanoseconds tidyMemory() {
     if (!tasks_.hasSpares()) return DelayedTasks::kNever;
     const std::chrono::nanoseconds now = steadyNow();
@@ -158,7 +158,7 @@ class ThreadSerialQueue::Worker {
   Parker parker_;
   DelayedTasks delayed_;
   std::atomic<bool> closed_{false};
-  // The thread's own.
+  // Used only by the thread.
   int polls_ = kMinPolls;
   std::chrono::nanoseconds next_tidying_{};
 };

@@ -1,4 +1,4 @@
-// ThreadSerialQueue: a serial queue that runs its tasks on a thread of its own.
+// ThreadSerialQueue: a serial queue that runs its tasks on its own thread.
 #pragma once
 
 #include "platform/concurrency.h"
@@ -9,26 +9,25 @@
 
 namespace quazor {
 
-// The thread and what it works on belong to each other, not to the queue: the last reference to the queue may go in
-// one of its own tasks, the thread ends when it has run what was due then, and nobody waits for it. A process may end
-// at any time, whatever is waiting or delayed.
+// The queue does not own its thread: the last reference to the queue may be released in one of its own tasks, the
+// thread ends after it has run the tasks that were due then, and nothing joins it. The process may end at any time,
+// even with pending or delayed tasks.
 //
-// A posted task costs no allocation of its own, no lock and, while the thread is at work, no system call. An idle
-// thread watches for the next task before it sleeps: for up to five microseconds when tasks have come that soon before,
-// hardly at all when they have not. The memory of the most tasks that waited is given back within a few tenths of a
-// second without work.
+// Posting a task needs no allocation, no lock and, while the thread is busy, no system call. An idle thread polls for
+// the next task before it sleeps: for up to five microseconds if tasks have recently arrived that quickly, much less
+// otherwise. Memory for peak loads is freed within a few tenths of a second of idle time.
 //
-// A delayed task is posted, as if by async, at the moment it becomes due: a task that is posted later runs later, even
-// when the thread was busy at that moment.
+// A delayed task is posted, as if by async(), when it becomes due: tasks that are posted later run later, even if the
+// thread was busy at that time.
 // Thread: any.
 class ThreadSerialQueue final : public SerialQueue {
  public:
-  // The thread is named with the last 15 characters of `label`, as many as the system keeps: labels of one subject
-  // share their beginning. A background thread gets a lower priority; where the system refuses, it goes without.
+  // The thread is named after the last 15 characters of `label`, the maximum length; labels of one subject share their
+  // beginning. A background thread gets a lower priority if the system permits.
   //
-  // Throws std::system_error when the process can have no more threads.
+  // Throws std::system_error if no thread can be created.
   ThreadSerialQueue(std::string_view label, QualityOfService quality);
-  // Never blocks. Delayed tasks that are not yet due are destroyed on the thread, behind the tasks that still run.
+  // Does not block. Delayed tasks that are not yet due are destroyed on the thread, after the tasks that still run.
   ~ThreadSerialQueue() override;
 
   void async(Task task) override;

@@ -1,4 +1,4 @@
-// Many threads at once, at random moments, from a fixed seed. Meant to be run under the thread sanitizer too.
+// Many concurrent threads at pseudo-random times from a fixed seed. Also run it under the thread sanitizer.
 #include "backends/threads/thread_semaphore.h"
 #include "backends/threads/thread_serial_queue.h"
 
@@ -29,7 +29,7 @@ std::string nameOf(const ::testing::TestParamInfo<QualityOfService>& info) {
 INSTANTIATE_TEST_SUITE_P(Qualities, ThreadSerialQueueStressTest,
                          ::testing::Values(QualityOfService::kUserInteractive, QualityOfService::kBackground), nameOf);
 
-// Keeps the processor for up to `most`, so that what follows comes at no particular moment.
+// Spins for a random time of up to `most`.
 void delay(std::minstd_rand& random, std::chrono::nanoseconds most) {
   const auto length = std::chrono::nanoseconds(random() % static_cast<unsigned>(most.count()));
   const auto end = std::chrono::steady_clock::now() + length;
@@ -56,7 +56,7 @@ TEST_P(ThreadSerialQueueStressTest, SeveralProducersLoseNothingAndKeepEachTheirO
       own->async([&done] { done.signal(); });
     });
   }
-  queue.reset();  // the producer that is last drops it
+  queue.reset();  // the last producer drops it
   for (std::size_t producer = 0; producer < kProducers; ++producer) done.wait();
   for (std::thread& producer : producers) producer.join();
   EXPECT_TRUE(ordered);
@@ -69,7 +69,7 @@ TEST_P(ThreadSerialQueueStressTest, NoTaskIsForgottenHoweverItsPostMeetsTheThrea
   ThreadSemaphore done(0);
   for (int round = 0; round < 10'000; ++round) {
     queue->async([&done] { done.signal(); });
-    done.wait();  // for ever, if the thread slept through it
+    done.wait();  // never returns if the thread missed the task
     delay(random, std::chrono::microseconds(20));
   }
 }

@@ -23,7 +23,7 @@
 namespace quazor {
 namespace {
 
-// What `question` answers on the queue's thread.
+// Evaluates `question` on the queue's thread.
 template <class Question>
 auto askThread(SerialQueue& queue, Question question) {
   decltype(question()) answer{};
@@ -79,7 +79,7 @@ TEST(ThreadSerialQueueTest, EachQueueHasOneThreadOfItsOwn) {
   EXPECT_NE(std::this_thread::get_id(), thread);
 }
 
-// How many threads of this process have that name.
+// The number of threads of this process with that name.
 int threadsNamed(const std::string& name) {
   int count = 0;
   for (const auto& thread : std::filesystem::directory_iterator("/proc/self/task")) {
@@ -165,7 +165,7 @@ TEST(ThreadSerialQueueTest, TasksThatAreNotYetDueAreDestroyedOnTheThread) {
   EXPECT_EQ(destroying, own);
 }
 
-// A queue of its own with every kind of pending work, left as it is.
+// Abandons a queue with every kind of pending work.
 void leavePendingWork() {
   for (const auto quality : {QualityOfService::kUserInteractive, QualityOfService::kBackground}) {
     auto* const leaked = new std::shared_ptr<SerialQueue>(std::make_shared<ThreadSerialQueue>("pending", quality));
@@ -180,7 +180,7 @@ TEST(ThreadSerialQueueDeathTest, PendingWorkNeitherDelaysNorCrashesTheEndOfThePr
   GTEST_FLAG_SET(death_test_style, "threadsafe");
   EXPECT_EXIT(
       {
-        alarm(20);  // kills a process that does not end
+        alarm(20);  // kills the process if it does not end
         leavePendingWork();
         std::exit(7);
       },

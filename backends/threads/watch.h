@@ -1,4 +1,4 @@
-// Watch: looking out for what a thread waits for, for a moment, before the thread sleeps.
+// Watch: spins briefly before a thread sleeps.
 #pragma once
 
 #include "backends/threads/task_list.h"
@@ -8,18 +8,18 @@
 
 namespace quazor {
 
-// To sleep and be woken takes the system tens of microseconds; what comes sooner is had sooner by looking. A look-out
-// in vain costs that time, so the next ones are left out: one after the first, twice as many after each further one in
-// vain, until one succeeds. A thread that is woken now and then looks out once in a thousand times.
+// Sleeping and waking takes tens of microseconds; spinning is faster if the event comes sooner. A spin in vain wastes
+// that time, so the following spins are skipped: one after the first failure, and twice as many after each further one,
+// until a spin succeeds. A thread that is rarely woken spins once in a thousand times.
 //
 // Thread: the waiting one.
 class Watch {
  public:
-  // As long as a sleep and a wake-up take.
+  // The cost of a sleep and a wake-up.
   static constexpr std::chrono::nanoseconds kMaxLength = std::chrono::microseconds(40);
 
-  // Asks `ready` again and again until it holds, kMaxLength has passed or `now` has reached `deadline`; or does not ask
-  // at all. True when it held.
+  // Calls `ready` repeatedly until it returns true, kMaxLength has passed or `now` has reached `deadline`; may skip the
+  // calls. Returns true if `ready` did.
   template <class Ready, class Now>
   bool spin(Ready&& ready, Now&& now, std::chrono::nanoseconds deadline) {
     if (toLeaveOut_ > 0) {

@@ -12,10 +12,10 @@ using namespace std::chrono_literals;
 
 constexpr std::chrono::nanoseconds kNever = std::chrono::nanoseconds::max();
 
-// A clock that goes on by 10 microseconds each time it is read.
+// The clock advances by 10 microseconds on each reading.
 class WatchTest : public testing::Test {
  protected:
-  // True when the watch asked at least once; `ready` is what it got as an answer.
+  // True if the watch called `ready`, which returns the given value.
   bool looks(bool ready, std::chrono::nanoseconds deadline = kNever) {
     bool asked = false;
     succeeded_ = watch_.spin(
@@ -27,7 +27,7 @@ class WatchTest : public testing::Test {
     return asked;
   }
 
-  // How many look-outs in a row are left out before the next one, which is in vain.
+  // The number of consecutive spins that are skipped before the next, unsuccessful one.
   int leftOut() {
     int count = 0;
     while (!looks(false)) ++count;

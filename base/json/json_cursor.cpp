@@ -101,7 +101,7 @@ std::int64_t JsonCursor::integer() const {
 }
 
 std::uint64_t JsonCursor::integer(std::uint64_t minimum, std::uint64_t maximum) const {
-  // A number that was read from a text is unsigned unless it is negative.
+  // The parser stores integers as unsigned unless they are negative.
   const bool fits = value_->is_number_unsigned() && value_->get<std::uint64_t>() >= minimum &&
                     value_->get<std::uint64_t>() <= maximum;
   if (!fits && minimum == maximum) failType(std::to_string(minimum));

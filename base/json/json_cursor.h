@@ -1,4 +1,4 @@
-// JsonCursor: a value of a JSON document that knows where it stands.
+// JsonCursor: a value in a JSON document together with its path.
 #pragma once
 
 #include "base/json/json_document.h"
@@ -16,15 +16,15 @@
 
 namespace quazor {
 
-// Reads with checks: every wrong type, unknown key and number out of range throws InputError, "NAME:LINE: PATH: " and
-// one sentence that says what is wrong and what would be right.
+// Checked access: a wrong type, an unknown key or a number out of range throws InputError, "NAME:LINE: PATH: " and one
+// sentence with the problem and the expectation.
 //
 // Borrows the document.
 // Thread: one at a time.
 class JsonCursor {
  public:
   explicit JsonCursor(const JsonDocument& document) : JsonCursor(document.value(), "", &document) {}
-  // A value that is in no file: errors have no name and no line.
+  // A value that does not come from a file: errors contain no name and no line.
   explicit JsonCursor(const nlohmann::ordered_json& value) : JsonCursor(value, "", nullptr) {}
 
   const std::string& path() const { return path_; }
@@ -35,19 +35,19 @@ class JsonCursor {
   bool isObject() const { return value_->is_object(); }
   bool isArray() const { return value_->is_array(); }
 
-  // Of objects. `keys` are all the keys there may be.
+  // For objects. `keys` are all allowed keys.
   void allowKeys(std::initializer_list<std::string_view> keys) const;
-  // Returns the entry, which is required: throws if it is missing.
+  // The entry, which is required: throws if it is missing.
   JsonCursor at(std::string_view key) const;
-  // The entry, where it is there.
+  // The entry, if it exists.
   std::optional<JsonCursor> find(std::string_view key) const;
-  // All entries, in the document's order.
+  // All entries, in document order.
   std::vector<std::pair<std::string, JsonCursor>> entries() const;
 
-  // Of arrays.
+  // For arrays.
   std::vector<JsonCursor> elements() const;
 
-  // Of values.
+  // For other values.
   bool boolean() const;
   // Not empty.
   std::string text() const;
@@ -56,13 +56,13 @@ class JsonCursor {
   double number(double minimum, double maximum) const;
   // Above 0.
   double positiveNumber(double maximum) const;
-  // A number, a boolean or a string; whole numbers are signed integers where they fit one.
+  // A number, a boolean or a string; integers are signed if they fit.
   Value scalar() const;
-  // One of `names`; `what` says what they are: "an action".
+  // One of `names`. `what` is the noun for messages, for example "an action".
   std::string oneOf(std::span<const std::string_view> names, std::string_view what) const;
 
   [[noreturn]] void fail(const std::string& sentence) const;
-  // "must be `expected`, not ...": what stands there is told.
+  // Throws "must be `expected`, not ..." with a description of the actual value.
   [[noreturn]] void failType(const std::string& expected) const;
 
  private:
@@ -70,20 +70,20 @@ class JsonCursor {
       : value_(&value), path_(std::move(path)), document_(document) {}
 
   JsonCursor inside(const nlohmann::ordered_json& value, std::string path) const;
-  // What is wrong stands at `place`, which is this path or one in it.
+  // Throws an error for `place`, which is this path or one below it.
   [[noreturn]] void fail(const std::string& sentence, const std::string& place) const;
   const nlohmann::ordered_json& object() const;
 
   const nlohmann::ordered_json* value_;
   std::string path_;
-  const JsonDocument* document_;  // null: none
+  const JsonDocument* document_;  // null: no document
 };
 
-// `"name"`, as a document has it.
+// Returns `"name"`, quoted as in a document.
 std::string inQuotes(std::string_view name);
 
-// `; did you mean "near"?` with the nearestName() of `names`, else `; expected one of "a", "b".`: the end of a sentence
-// about a name that does not exist.
+// The end of a sentence about an unknown name: `; did you mean "near"?` with the nearestName() in `names`, or `;
+// expected one of "a", "b".`
 std::string suggestion(std::string_view name, std::span<const std::string_view> names);
 
 }  // namespace quazor

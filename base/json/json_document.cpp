@@ -19,8 +19,8 @@ namespace {
 
 using Json = nlohmann::ordered_json;
 
-constexpr std::size_t kMaxFile = 16U << 20;  // a device may have no end
-// Deeper than any document. Bounds the recursion of those who walk the document.
+constexpr std::size_t kMaxFile = 16U << 20;  // limits the input from devices, which may be endless
+// Deeper than any valid document. Limits the recursion of code that walks a document.
 constexpr std::size_t kMaxDepth = 32;
 
 std::string lineAt(std::string_view text, std::size_t offset) {
@@ -28,14 +28,14 @@ std::string lineAt(std::string_view text, std::size_t offset) {
   return std::to_string(std::ranges::count(before, '\n') + 1);
 }
 
-// How far the parser has come: it counts the ends of lines before the character that it took last, which is the last
-// one of what it tells of, or one beyond where that is a number.
+// The progress of the parser: the number of line ends before the character that it read last. That is the last
+// character of the reported value or, for a number, the one after it.
 struct Progress {
   std::size_t line = 1;
   bool tookLineEnd = false;
 };
 
-// Hands a text to the parser, and tells the progress.
+// Feeds a text to the parser and records the progress.
 class CountingIterator {
  public:
   using iterator_category = std::input_iterator_tag;
@@ -59,12 +59,12 @@ class CountingIterator {
   Progress* progress_;
 };
 
-// Follows the parser through the document, to know where it stands and which keys an object has had.
+// Follows the parser through the document to track the current path and the keys of each object.
 class Tracker {
  public:
   explicit Tracker(std::string name) : name_(std::move(name)) {}
 
-  // Parses, and calls `visit` wherever path() and line() may have changed.
+  // Parses the text and calls `visit` whenever path() and line() may have changed.
   template <typename Visit>
   Json parse(std::string_view text, const Visit& visit) {
     const auto follow = [&](int, Json::parse_event_t event, Json& parsed) {
@@ -77,7 +77,7 @@ class Tracker {
   }
 
   std::size_t line() const { return progress_.line; }
-  // "NAME:LINE: PATH: " or, in the document as a whole, "NAME:LINE: ".
+  // "NAME:LINE: PATH: " or, for the document as a whole, "NAME:LINE: ".
   std::string place() const {
     const std::string where = path();
     return name_ + ":" + std::to_string(line()) + ": " + (where.empty() ? "" : where + ": ");
@@ -95,8 +95,8 @@ class Tracker {
  private:
   struct Container {
     bool isArray = false;
-    std::size_t elements = 0;  // begun so far, of an array
-    std::string key;           // the present one, of an object
+    std::size_t elements = 0;  // the number of elements started, for an array
+    std::string key;           // the current key, for an object
     std::set<std::string> keys;
   };
 
@@ -135,7 +135,7 @@ class Tracker {
   std::vector<Container> open_;
 };
 
-// The parser's own words for what it met, without its preamble.
+// The parser's message without its prefix.
 std::string complaintOf(const Json::parse_error& error) {
   const std::string text = error.what();
   const std::size_t dash = text.find(" - ");
@@ -166,7 +166,7 @@ std::string textOf(const std::filesystem::path& file) {
   std::ifstream stream(file, std::ios::binary);
   if (!stream) throw InputError(name + ": the file cannot be opened; check its permissions.");
   std::string text;
-  std::array<char, 65536> piece;  // read() notes a failure where iterators throw
+  std::array<char, 65536> piece;  // read() reports a failure where stream iterators throw
   while (stream.read(piece.data(), piece.size()) || stream.gcount() > 0) {
     text.append(piece.data(), static_cast<std::size_t>(stream.gcount()));
     if (text.size() > kMaxFile) throw InputError(name + ": the file is larger than 16 MiB.");

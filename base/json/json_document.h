@@ -1,4 +1,4 @@
-// JsonDocument: a JSON file, strictly read.
+// JsonDocument: a JSON file, parsed strictly.
 #pragma once
 
 #include <nlohmann/json.hpp>
@@ -11,26 +11,26 @@
 
 namespace quazor {
 
-// One JSON value, and the lines of the text that it was read from. Read values through JsonCursor.
+// One JSON value, and the line numbers of the text that it was parsed from. JsonCursor reads the values.
 //
 // Thread: one at a time
 class JsonDocument {
  public:
-  // Parses `text`, which must be UTF-8 and nothing but one JSON value, without two equal keys in one object and nested
-  // at most 32 deep. `name` is the file's, for people. Throws InputError, "NAME:LINE: ..." or, where that is known,
-  // "NAME:LINE: PATH: ...".
+  // Parses `text`, which must be UTF-8 and exactly one JSON value, without duplicate keys in an object and nested at
+  // most 32 deep. `name` is the user-readable name of the file. Throws InputError, "NAME:LINE: ..." or, if the path is
+  // known, "NAME:LINE: PATH: ...".
   JsonDocument(std::string text, std::string name);
 
-  // Reads a file of at most 16 MiB. Throws InputError, also for a file that cannot be read.
+  // Reads a file of at most 16 MiB. Throws InputError, also if the file cannot be read.
   static JsonDocument read(const std::filesystem::path& file);
 
   const nlohmann::ordered_json& value() const { return value_; }
-  // Changes the value, by one that is merged with another document, for example. The text stays: an error has a line
-  // where its place is in the text.
+  // Replaces the value, for example with the result of a merge. The text remains: errors contain a line if their place
+  // exists in the text.
   void setValue(nlohmann::ordered_json value) { value_ = std::move(value); }
 
-  // Throws InputError, "NAME:LINE: PATH: SENTENCE", where the line is that of `place`, a path too. An empty path is the
-  // document as a whole.
+  // Throws InputError, "NAME:LINE: PATH: SENTENCE", with the line of `place`, which is a path too. An empty path means
+  // the whole document.
   [[noreturn]] void fail(const std::string& path, const std::string& sentence, const std::string& place) const;
 
  private:
@@ -39,14 +39,14 @@ class JsonDocument {
   nlohmann::ordered_json value_;
 };
 
-// The line, from 1, in which the value at `path` (as jsonPath() writes it) of the document in `text` begins, or the
-// key that it has; nothing where the path is not in the text. Parses the text again.
+// The line, starting at 1, on which the value at `path` (in the form of jsonPath()) or its key begins in `text`;
+// nothing if the path does not exist there. Parses the text again.
 std::optional<std::size_t> lineOfPath(std::string_view text, const std::string& path);
 
-// "PATH: SENTENCE"; an empty path is "the document".
+// "PATH: SENTENCE", with "the document" for an empty path.
 std::string sentenceAbout(const std::string& path, const std::string& sentence);
 
-// A path into a document: "faults" and 2 make "faults[2]"; that and "action" make "faults[2].action".
+// Extends a path: "faults" and 2 give "faults[2]"; that and "action" give "faults[2].action".
 std::string jsonPath(const std::string& path, std::string_view key);
 std::string jsonPath(const std::string& path, std::size_t index);
 

@@ -1,12 +1,12 @@
-// InputError: what is wrong with something that was given to be read.
+// InputError: the reason why an input is invalid.
 #pragma once
 
 #include <stdexcept>
 
 namespace quazor {
 
-// A text, a file or an argument that cannot be used. what() is a user-readable reason: one sentence, or the end of one
-// where the reader says so.
+// A text, a file or an argument that cannot be used. what() is user-readable: one sentence, or the end of one if the
+// reader's documentation says so.
 //
 // Thread: any
 class InputError : public std::runtime_error {

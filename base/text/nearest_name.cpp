@@ -5,7 +5,7 @@
 namespace quazor {
 
 std::size_t editDistance(std::string_view a, std::string_view b) {
-  // Three rows of the table of distances between the beginnings of both texts.
+  // Three rows of the table of distances between the prefixes of the texts.
   std::vector<std::size_t> beforeLast(b.size() + 1);
   std::vector<std::size_t> last(b.size() + 1);
   std::vector<std::size_t> row(b.size() + 1);

@@ -1,4 +1,4 @@
-// Finding what was meant by a name that does not exist.
+// Suggests an existing name for an unknown one.
 #pragma once
 
 #include <cstddef>
@@ -9,15 +9,15 @@
 
 namespace quazor {
 
-// The least number of characters to insert, delete, replace or swap with their neighbour that turns one text into the
-// other (optimal string alignment), in bytes.
+// The minimum number of byte insertions, deletions, replacements and swaps of neighbours that turn one text into the
+// other (optimal string alignment).
 std::size_t editDistance(std::string_view a, std::string_view b);
 
-// The candidate nearest to `name`, the first one of equals; nothing when even that one is too far away to be meant,
-// which is more than a third of the longer name's length.
+// The candidate nearest to `name`, the first one of several; nothing if the distance is more than a third of the length
+// of the longer name.
 std::optional<std::string> nearestName(std::string_view name, const std::vector<std::string>& candidates);
 
-// "; did you mean 'NAME'?" or, where nothing is near, an empty text: the end of a refusal's sentence.
+// "; did you mean 'NAME'?", or an empty text if no candidate is near: the end of an error message.
 std::string didYouMean(std::string_view name, const std::vector<std::string>& candidates);
 
 }  // namespace quazor

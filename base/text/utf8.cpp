@@ -10,7 +10,7 @@ Utf8Sequence firstUtf8Sequence(std::string_view text) {
   std::size_t length = 2;
   if (lead >= 0xE0) length = 3;
   if (lead >= 0xF0) length = 4;
-  // The second byte's range is narrower after these: overlong forms, surrogates, beyond U+10FFFF.
+  // After these first bytes the range of the second byte is narrower: overlong forms, surrogates, beyond U+10FFFF.
   unsigned low = 0x80;
   unsigned high = 0xBF;
   if (lead == 0xE0) low = 0xA0;

@@ -1,4 +1,4 @@
-// What of a text is UTF-8.
+// UTF-8 validation.
 #pragma once
 
 #include <cstddef>
@@ -12,14 +12,14 @@ struct Utf8Sequence {
   bool wellFormed;
 };
 
-// The character at the front of a text that is not empty, by the Unicode standard's table of well-formed UTF-8; else
-// as many bytes as a character could have begun with, at least one.
+// The character at the beginning of a non-empty text, according to the Unicode standard's table of well-formed UTF-8;
+// otherwise the bytes that could be the beginning of a character, at least one.
 Utf8Sequence firstUtf8Sequence(std::string_view text);
 
-// Where the first byte is that is not part of a well-formed character; nothing when the whole text is UTF-8.
+// The offset of the first byte that is not part of a well-formed character; nothing if the text is valid UTF-8.
 std::optional<std::size_t> findInvalidUtf8(std::string_view text);
 
-// True of every byte of a well-formed character but its first.
+// True for every byte of a well-formed character except the first.
 constexpr bool continuesUtf8(char byte) { return (static_cast<unsigned char>(byte) & 0xC0U) == 0x80U; }
 
 }  // namespace quazor

@@ -1,4 +1,4 @@
-// The names under which cameras appear in results.
+// The names of cameras in results.
 #pragma once
 
 #include <optional>
@@ -7,10 +7,10 @@
 
 namespace quazor {
 
-// The camera name of a port type (platform/capture_keys.h); nothing for a port type that has none. Any thread.
+// The camera name of a port type (platform/capture_keys.h); nothing if it has none. Any thread.
 std::optional<std::string_view> cameraNameForPortType(std::string_view portType);
 
-// The key of a camera's quantity in measurements and results: BackWide.FrameOffset.
+// The key of a camera's quantity in measurements and results, for example BackWide.FrameOffset.
 std::string cameraKey(std::string_view cameraName, std::string_view quantity);
 
 // The quantities of a camera.

@@ -16,7 +16,7 @@ bool hasPortType(CaptureStream& stream, std::string_view port) {
   return portType && portType->string() != nullptr && *portType->string() == port;
 }
 
-// The streams of the group that serve the ports, in the order of the ports; fewer than ports where one is missing.
+// The group's streams for the ports, in the order of the ports; shorter than `ports` if one is missing.
 CaptureStreams streamsForPorts(const CaptureStreams& groupStreams, const std::vector<std::string>& ports) {
   CaptureStreams selected;
   for (const std::string& port : ports) {
@@ -29,7 +29,7 @@ CaptureStreams streamsForPorts(const CaptureStreams& groupStreams, const std::ve
 
 Array arrayOf(const CaptureStreams& streams) { return Array(streams.begin(), streams.end()); }
 
-// Every stream delivers its own frames, each frame of the master's paired with one of the slave's.
+// Every slave delivers its own frames, one per frame of the master.
 Dictionary slaveConfiguration() {
   Dictionary configuration;
   configuration.set(capture_key::StreamingOutputsEnabled, true);
@@ -46,7 +46,7 @@ bool holdsString(const std::optional<Value>& list, std::string_view text) {
          });
 }
 
-// An entry of a status that is to be a number; one that is not reads 0.
+// A numeric entry of a status; 0 if it is not a number.
 Value numberIn(const Dictionary& status, std::string_view key) {
   const Value* number = status.find(key);
   return number != nullptr && number->isNumber() ? *number : Value(0);
@@ -112,7 +112,7 @@ bool CameraSession::activate() {
   return true;
 }
 
-// Of the master too. The configurations, by port, of the slaves that agreed.
+// Sets all streams, including the master's. Returns the configurations, by port, of the slaves that accepted it.
 Dictionary CameraSession::enableMultipleOutputs() {
   Dictionary configurations;
   for (std::size_t i = 0; i < streams_.size(); ++i) {

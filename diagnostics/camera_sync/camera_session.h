@@ -30,8 +30,8 @@ struct CameraReport {
   Value errorCounters;
 };
 
-// Thread: the one of the run. A failure that ends the run, or that the run goes on from, is logged where it happens;
-// what fails while a failed run is ended is not. A property that cannot be read counts as absent.
+// Thread: the one of the run. Logs each failure that ends the run or is tolerated, but not the failures while a failed
+// run is cleaned up. A property that cannot be read counts as absent.
 class CameraSession {
  public:
   // Finds the device's first group that has a stream for every port, acquires control of these streams, and configures
@@ -54,7 +54,7 @@ class CameraSession {
   void finish();
   // Like finish(), for a failed run: failures are not logged.
   void abandon();
-  // Releases control of the streams. Failures are ignored.
+  // Releases control of the streams. Ignores failures.
   void relinquish();
 
  private:

@@ -19,8 +19,8 @@ const Measurement* findMeasurement(const QZExperimentResult& result, const std::
   return measurement;
 }
 
-// The bounds are the camera's own total, so any total that is a number is inside: totals are not compared with each
-// other, and only the first camera goes without the limit.
+// Both bounds are the camera's own total, so every total that is a number passes: totals are not compared with each
+// other. Only the first camera has no limit.
 QZLimit frameTotalLimit(const Measurement& total) {
   QZLimit limit("FrameTotalLimit");
   limit.setLowerBound(std::make_shared<const QZBound>(total, false));

@@ -45,7 +45,7 @@ std::string boundText(const std::shared_ptr<const QZBound>& bound) {
          (bound->open() ? " open" : " closed");
 }
 
-// Every measured result in one line: NAME = VALUE UNIT [LIMIT: LOWER to UPPER].
+// Formats a measured result as NAME = VALUE UNIT [LIMIT: LOWER to UPPER].
 std::string told(const QZAnalysisResult& result) {
   std::string text;
   for (const QZMeasuredResult& measured : result.measuredResults()) {
@@ -60,7 +60,7 @@ std::string told(const QZAnalysisResult& result) {
   return text;
 }
 
-// A result's measurements and auxiliary data with their order.
+// Formats measurements and auxiliary data in their order.
 std::string told(const QZExperimentResult& result) {
   std::string text;
   for (const auto& [key, measurement] : result.measurements()) {

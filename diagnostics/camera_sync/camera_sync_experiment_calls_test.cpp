@@ -1,4 +1,4 @@
-// What the experiment hands to the capture service, to the kind of a number and to the object.
+// The exact arguments of the experiment's calls to the capture service, including types and objects.
 #include "tests/support/fake_capture.h"
 
 namespace quazor {
@@ -6,7 +6,7 @@ namespace {
 
 using CameraSyncExperimentCalls = FakeCaptureTest;
 
-// A slave's configuration; the ratio is an integer, signed or not.
+// Checks the configuration of a slave; the ratio may be a signed or unsigned integer.
 void expectSlaveConfiguration(const Value* configuration, const std::string& whose) {
   SCOPED_TRACE(whose);
   ASSERT_NE(configuration, nullptr);
@@ -135,7 +135,7 @@ TEST_F(CameraSyncExperimentCalls, AFormatIndexThatIsMissingIsARefusedOne) {
   const struct {
     const char* name;
     Array formatIndexes;
-    std::string configuration;  // what the streams before were configured with
+    std::string configuration;  // the expected configuration of the earlier streams
     std::string port;
   } rows[] = {
       {"the last one",
@@ -179,7 +179,7 @@ TEST_F(CameraSyncExperimentCalls, TheFirstGroupThatHasEveryPortIsChosen) {
   const auto broken = makeGroup("broken", {});
   broken->members.reset();
   const auto front = makeStream("front", "FrontFacingCamera");
-  const auto odd = makeStream("odd", 16);  // its port type is no string
+  const auto odd = makeStream("odd", 16);  // its port type is not a string
   device->groups = {broken,
                     makeGroup("empty", {}),
                     makeGroup("small", {wide}),

@@ -1,4 +1,4 @@
-// The experiment on capture services that answer what no healthy phone would.
+// The experiment with capture services that return values no healthy phone returns.
 #include "tests/support/fake_capture.h"
 
 #include <cstdint>
@@ -9,7 +9,7 @@ namespace {
 
 using CameraSyncExperimentEdges = FakeCaptureTest;
 
-// What the wide camera's session entry is logged as, when it is the master.
+// The log line for the wide camera's session entry if that camera is the master.
 std::string reportLine(std::string_view offset, std::string_view frames, std::string_view total) {
   return formatMessage(
       "log default: BackFacingCamera <-- sync master\n  Offset: %@\n  Frames: %@\n  Total: %@\n"
@@ -167,7 +167,7 @@ TEST_F(CameraSyncExperimentEdges, APortThatIsAskedForTwiceIsConfiguredWhereverIt
   const std::string configuration =
       "tele set SynchronizedStreamsSlaveConfiguration = {StreamingOutputsEnabled = 1; FrameSkippingEnabled = 0; "
       "TimeMachineEnabled = 0; MasterToSlaveFrameRateRatio = 1}\n";
-  // One entry for the port, though two streams carry it: one scan over all of them.
+  // One log entry, although the port occurs twice: the streams are scanned once.
   EXPECT_EQ(between(text, "log default: Device does not support", "wide set FormatIndex"),
             "log default: Device does not support SlaveConfigurationByPortType, using "
             "SynchronizedStreamsSlaveConfiguration instead.\n"

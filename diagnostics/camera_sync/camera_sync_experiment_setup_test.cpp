@@ -1,4 +1,4 @@
-// What the experiment says of itself, what it is set up with, and what becomes of it.
+// The experiment's description, setup and lifetime.
 #include "tests/support/fake_capture.h"
 
 #include <cmath>
@@ -63,7 +63,7 @@ TEST_F(CameraSyncExperimentSetup, RefusesADurationBelowTwoSeconds) {
     ASSERT_NE(error, nullptr);
     EXPECT_EQ(errorChain(error), row.accepted ? "CallerErrorDomain code 1: Here before the run."
                                               : "QZErrorDomain code 5: duration must be at least 2s!");
-    EXPECT_EQ(transcript.text(), "");  // no service is called and nothing is logged
+    EXPECT_EQ(transcript.text(), "");  // no service was called and nothing was logged
   }
 }
 
@@ -132,7 +132,7 @@ TEST_F(CameraSyncExperimentSetup, KeepsNothingOfTheCaptureServiceAfterItsRun) {
   ASSERT_NE(experiment.run(nullptr), nullptr);
   EXPECT_TRUE(service->lastPlugIn.expired());
 
-  // What the fakes hold of each other goes first; the experiment still stands, with its platform.
+  // Breaks the reference cycle of the fakes first, while the experiment and its platform still exist.
   service->device.reset();
   device->groups.clear();
   device->properties = {};

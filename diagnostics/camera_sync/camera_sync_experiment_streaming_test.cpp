@@ -1,4 +1,4 @@
-// Whole runs on a simulated phone that fail, or stumble, once the cameras have been synchronised.
+// Complete runs on a simulated phone with failures after the cameras have been synchronised.
 #include "diagnostics/camera_sync/camera_sync_experiment.h"
 
 #include "tests/sweeps/camera_sync_bench.h"
@@ -11,7 +11,7 @@ namespace {
 constexpr const char* kStart = "CaptureStream.start";
 constexpr const char* kStop = "CaptureStream.stop";
 
-// A refused format index: code 209; a refused frame rate: no error at all.
+// A rejected format index gives code 209; a rejected frame rate gives no error.
 class FailingConfiguration : public testing::TestWithParam<FaultRow> {};
 
 TEST_P(FailingConfiguration, IsToldExactly) {
@@ -166,7 +166,7 @@ log error: Failed to stop steam! {error}
 back-tele stop
 back-wide stop
 device relinquish control (back-wide, back-tele, back-super-wide) -> failed
-log error: Failed to relinquish steam! SimulatedCaptureErrorDomain code 10: back-super-wide is running; stop it before giving it back.
+log error: Failed to relinquish steam! SimulatedCaptureErrorDomain code 10: back-super-wide is running; stop it before releasing control.
 )",
      "returned a result"},
     {"TheMiddleStop",
@@ -175,7 +175,7 @@ log error: Failed to relinquish steam! SimulatedCaptureErrorDomain code 10: back
 log error: Failed to stop steam! {error}
 back-wide stop
 device relinquish control (back-wide, back-tele, back-super-wide) -> failed
-log error: Failed to relinquish steam! SimulatedCaptureErrorDomain code 10: back-tele is running; stop it before giving it back.
+log error: Failed to relinquish steam! SimulatedCaptureErrorDomain code 10: back-tele is running; stop it before releasing control.
 )",
      "returned a result"},
     {"TheLastStop",
@@ -183,7 +183,7 @@ log error: Failed to relinquish steam! SimulatedCaptureErrorDomain code 10: back
      R"(back-wide stop -> failed
 log error: Failed to stop steam! {error}
 device relinquish control (back-wide, back-tele, back-super-wide) -> failed
-log error: Failed to relinquish steam! SimulatedCaptureErrorDomain code 10: back-wide is running; stop it before giving it back.
+log error: Failed to relinquish steam! SimulatedCaptureErrorDomain code 10: back-wide is running; stop it before releasing control.
 )",
      "returned a result"},
     {"TheGivingBack",
@@ -277,7 +277,7 @@ ErrorCounters = {Front = {I2CErrorCount = 44}; FrontInfrared = {I2CErrorCount = 
              Side::kFront, scenario);
 }
 
-// What the phone itself refuses is told as what a fault refuses.
+// A rejection by the phone is reported like an injected fault.
 TEST(CameraSyncExperiment, TellsThePhonesOwnRefusals) {
   Scenario scenario = cameraSyncScenario();
   cameraOf(scenario, "back-tele").formats.resize(14);

@@ -1,4 +1,4 @@
-// Whole runs on a simulated phone, healthy ones and those that fail before a stream is configured.
+// Complete runs on a simulated phone: healthy ones, and those that fail before a stream is configured.
 #include "diagnostics/camera_sync/camera_sync_experiment.h"
 
 #include "tests/sweeps/camera_sync_bench.h"
@@ -169,7 +169,7 @@ TEST_P(FailingSlaveConfiguration, IsToldExactly) {
                       kHealthyBackRunWithoutMasterConfiguration);
 }
 
-// Ports are read thrice, twice and once before the slaves are configured.
+// PortType is read three times before the slaves are configured.
 const FaultRow kSlaveConfigurationRows[] = {
     {"TheMasterTellsNoPort",
      {kReadStream, "back-wide", "PortType", 4},

@@ -1,4 +1,4 @@
-// A clock that shows what a test sets.
+// A clock with a settable date.
 #pragma once
 
 #include "platform/clock.h"
@@ -7,7 +7,7 @@
 
 namespace quazor {
 
-// Shows 2026-11-21 01:08:00 in UTC until told otherwise. Sleeping is a matter of setting it on.
+// Shows 2026-11-21 01:08:00 UTC until a test sets another date. Sleeping advances the clock.
 class FixedClock final : public Clock {
  public:
   std::chrono::nanoseconds now() const override { return date_.time_since_epoch(); }

@@ -17,7 +17,7 @@ void* RecordPool::take(std::size_t size) {
 }
 
 void RecordPool::give(void* block) noexcept {
-  // cppcheck-suppress legacyUninitvar  // it does not see what placement new makes
+  // cppcheck-suppress legacyUninitvar  // does not recognise placement new
   Free* const head = ::new (block) Free{given_.load(std::memory_order_relaxed)};
   while (!given_.compare_exchange_weak(head->next, head, std::memory_order_release, std::memory_order_relaxed)) {
   }

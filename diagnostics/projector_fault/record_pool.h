@@ -50,7 +50,7 @@ class PoolAllocator {
   template <class Other>
   PoolAllocator(const PoolAllocator<Other>& other) : pool_(&other.pool()) {}
 
-  // One object at a time.
+  // REQUIRES: `count` is 1.
   T* allocate(std::size_t count) { return static_cast<T*>(pool_->take(count * sizeof(T))); }
   void deallocate(T* object, std::size_t /*count*/) noexcept { pool_->give(object); }
 

@@ -13,7 +13,7 @@ namespace {
 constexpr std::string_view kFrameCountMeasurement = "FrameCount";
 constexpr std::int64_t kMissingMeasurement = 6;
 
-// Appends the measurement under `key` as a result that must be zero in `unit`; false when there is none.
+// Appends the measurement under `key` as a result that must be zero in `unit`; returns false if it is missing.
 bool appendZeroLimited(QZAnalysisResult& analysis, const QZExperimentResult& result, std::string_view key,
                        std::string_view name, const QZUnit& unit, DiagnosticErrorPtr* error) {
   const Measurement* measurement = result.measurements().find(key);

@@ -1,4 +1,4 @@
-// QZTesselFaultAnalysis: enough frames, no errors, no fault events.
+// QZTesselFaultAnalysis: requires enough frames, no errors and no fault events.
 #pragma once
 
 #include "contract/diagnostic_contract.h"

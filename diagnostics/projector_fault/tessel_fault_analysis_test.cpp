@@ -17,7 +17,7 @@
 namespace quazor {
 namespace {
 
-// A run of 100 frames without a fault.
+// The result of a run with 100 frames and no fault.
 QZExperimentResult resultOfSoundRun() {
   QZExperimentResult result = resultOfQuietModule();
   result.measurements().set("FrameCount", Measurement(100, QZDimensionlessUnit::frames()));
@@ -27,7 +27,7 @@ QZExperimentResult resultOfSoundRun() {
   return result;
 }
 
-// A run's results as text: the module's channels without events, then `frames`, then the counters without errors.
+// The measured results as text: the module's channels without events, then `frames`, then the counters without errors.
 std::string soundResults(const std::string& frames) {
   std::string text;
   for (const std::string_view name : moduleChannels()) {

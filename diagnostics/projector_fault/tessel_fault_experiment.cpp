@@ -1,4 +1,4 @@
-// Setup, configuration, result and teardown; the frames' way through the queues is in tessel_fault_pipeline.cpp.
+// Setup, configuration, result and teardown; tessel_fault_pipeline.cpp processes the frames.
 #include "diagnostics/projector_fault/tessel_fault_experiment.h"
 
 #include "diagnostics/projector_fault/tessel_fault_analysis.h"
@@ -19,7 +19,7 @@ namespace {
 constexpr std::string_view kTimeoutParameter = "timeout";
 constexpr std::int64_t kBadParameter = 5;
 
-// What the light source and the stream are set to.
+// The settings of the light source and the stream.
 constexpr int kStructuredLightMode = 2;
 constexpr int kStructuredLightCurrent = 0;
 constexpr int kStructuredLightPattern = 1;
@@ -119,8 +119,8 @@ bool QZTesselFaultExperiment::_openStream(DiagnosticErrorPtr* error) {
   return true;
 }
 
-// A stream that does not tell its port type is passed over, but its error is told: it stays in `error` even when a
-// later stream serves the port.
+// Skips a stream whose port type cannot be read, but reports its error: it stays in `error` even if a later stream
+// serves the port.
 bool QZTesselFaultExperiment::_findStream(const CaptureStreams& streams, DiagnosticErrorPtr* error) {
   for (const std::shared_ptr<CaptureStream>& stream : streams) {
     DiagnosticErrorPtr underlying;
@@ -186,7 +186,7 @@ bool QZTesselFaultExperiment::_configureStream(DiagnosticErrorPtr* error) {
   return true;
 }
 
-// The first snapshot of the fault channels, and in `channels` the set that it is of; null on failure.
+// Returns the first snapshot of the fault channels and stores its set in `channels`; null on failure.
 std::shared_ptr<const ReportSnapshot> QZTesselFaultExperiment::_subscribe(
     std::shared_ptr<const ReportChannelSet>& channels, DiagnosticErrorPtr* error) {
   DiagnosticErrorPtr channelsError;
@@ -236,7 +236,7 @@ std::unique_ptr<QZExperimentResult> QZTesselFaultExperiment::_buildResult() cons
     setCounter("SIF", "SIFErrorCount");
     setCounter("Projector", "ProjectorErrorCount");
   }
-  // A channel may bear one of the names above; its count then stands.
+  // If a channel has one of the names above, its count replaces that measurement.
   measurements.setAll(
       samples,
       [](const ReportSample& sample) -> const std::string& { return sample.channel().channelDescription().name; },

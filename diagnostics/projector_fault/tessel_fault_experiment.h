@@ -22,9 +22,9 @@ namespace quazor {
 // Must be owned by a std::shared_ptr: its stream's handlers hold it weakly, some of its tasks strongly. The last
 // reference may be released on any thread, including a thread of its own queues.
 //
-// Thread: the host's calls come on the host's thread. Frames and events come on the capture service's threads and are
-// taken in on the receiving queue, where they are counted; lit or not is found out on the processing queue, where
-// the timeout runs too. Whichever ends the stream does so under the experiment's lock, once.
+// Thread: the host's calls are made on the host's thread. Frames and events arrive on the capture service's threads.
+// The receiving queue counts the frames; the processing queue checks that they were lit and handles the timeout. The
+// first of these that ends the stream does so under the experiment's lock.
 class QZTesselFaultExperiment final : public QZExperiment,
                                       public QZTeardown,
                                       public std::enable_shared_from_this<QZTesselFaultExperiment> {
@@ -65,7 +65,7 @@ class QZTesselFaultExperiment final : public QZExperiment,
                                               DiagnosticErrorPtr* error);
   std::unique_ptr<QZExperimentResult> _buildResult() const;
 
-  // Any thread. Takes over the caller's reference to the buffer, and releases it only when the frame is passed on to
+  // Any thread. Takes over the caller's reference to the buffer, which is released only if the frame is passed on to
   // the processing queue.
   void _handlePixelBuffer(PixelBuffer& buffer, MediaTime time);
   // Any thread.
@@ -74,7 +74,7 @@ class QZTesselFaultExperiment final : public QZExperiment,
   static void _takeIn(std::shared_ptr<QZTesselFaultExperiment> self, PixelBuffer& buffer, MediaTime time);
   // On the processing queue.
   void _examine(const QZTesselFrameDescription& frame, std::uint64_t number);
-  // Any thread. Ends the stream, the first time it is called; `error` may be null.
+  // Any thread. The first call ends the stream; `error` may be null.
   void _stopWithError(const DiagnosticErrorPtr& error);
 
   Platform _platform;
@@ -82,12 +82,12 @@ class QZTesselFaultExperiment final : public QZExperiment,
   std::uint64_t _formatIndex = 0;
   std::shared_ptr<CaptureDevice> _device;
   std::shared_ptr<CaptureStream> _stream;
-  std::shared_ptr<Semaphore> _done_semaphore;  // signalled once, when the stream has been stopped
-  DiagnosticErrorPtr _error;                   // what ended the stream; written before the signal, read after it
-  std::optional<Value> _errorCounters;         // read at the stop; as _error
+  std::shared_ptr<Semaphore> _done_semaphore;  // signalled once, after the stream was stopped
+  DiagnosticErrorPtr _error;            // the error that ended the stream; written before the signal, read after it
+  std::optional<Value> _errorCounters;  // read at the stop; same rule as _error
   std::shared_ptr<const ReportSnapshot> _telemonDelta;
   std::atomic<std::uint64_t> _frameCount{0};  // written on the receiving queue only
-  RecordPool _records;                        // of frames that wait for their examination
+  RecordPool _records;                        // of frames that wait for examination
   std::shared_ptr<SerialQueue> _receivingQueue;
   std::shared_ptr<SerialQueue> _processingQueue;
   std::recursive_mutex _mutex;     // held for all of _stopWithError

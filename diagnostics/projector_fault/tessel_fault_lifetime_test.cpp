@@ -1,4 +1,4 @@
-// How long an experiment lives, and what becomes of frames that find it gone.
+// The lifetime of the experiment, and frames that arrive after its end.
 #include "diagnostics/projector_fault/tessel_fault_experiment.h"
 
 #include "backends/simulated/simulated_phone.h"
@@ -18,7 +18,7 @@ namespace {
 
 using std::chrono::milliseconds;
 
-// Buffers that reach a handler without an experiment behind it are not given back.
+// A handler without an experiment does not release the buffers that it receives.
 TEST(TesselFaultLifetime, LeavesFramesAndEventsAloneWhenItIsGone) {
   RunTranscript transcript;
   Scenario scenario = projectorScenario();
@@ -37,7 +37,7 @@ TEST(TesselFaultLifetime, LeavesFramesAndEventsAloneWhenItIsGone) {
   EXPECT_EQ(phone.buffersHeld(),
             (std::vector<SimulatedPhone::HeldBuffer>{{"front-infrared", 0}, {"front-infrared", 1}}));
 
-  // The handlers are still there.
+  // The stream still has the handlers.
   const auto handlers = stream->valueForProperty(capture_key::VideoOutputHandlers, nullptr);
   ASSERT_TRUE(handlers);
   const Dictionary& output = *handlers->dictionary()->find(capture_key::PrimaryScaler)->dictionary();
@@ -48,7 +48,7 @@ TEST(TesselFaultLifetime, LeavesFramesAndEventsAloneWhenItIsGone) {
   EXPECT_EQ(transcript.text().substr(before), "");
 }
 
-// Intake that was queued before the experiment went finds nobody.
+// A queued intake does not keep the experiment alive.
 TEST(TesselFaultLifetime, IsNotKeptByFramesOnTheirWay) {
   SimulatedPhone phone(projectorScenario(), PhoneTime::kVirtual, 1);
   const auto stream = std::make_shared<HandMadeStream>();

@@ -1,4 +1,4 @@
-// The frames' way through QZTesselFaultExperiment: handlers, intake, examination, timeout and stop.
+// The processing of frames in QZTesselFaultExperiment: handlers, intake, examination, timeout and stop.
 #include "contract/log_channel.h"
 #include "diagnostics/projector_fault/tessel_fault_errors.h"
 #include "diagnostics/projector_fault/tessel_fault_experiment.h"
@@ -12,7 +12,7 @@ namespace quazor {
 
 namespace {
 
-// The infrared light sources 1 and 2 light a frame; nothing else does.
+// Only the infrared light sources 1 and 2 light a frame.
 bool isLit(const QZTesselFrameDescription& frame) {
   const std::int32_t source = toInt32(pointerTo(frame.infraredLightSource()));
   return source == 1 || source == 2;
@@ -20,8 +20,8 @@ bool isLit(const QZTesselFrameDescription& frame) {
 
 }  // namespace
 
-// A frame's task on the processing queue. Drops the frame's record before the experiment that the record's memory
-// belongs to.
+// The task of a frame on the processing queue. Destroys the frame's record before the experiment, which owns the
+// record's memory.
 struct QZTesselFaultExperiment::Examination {
   std::shared_ptr<QZTesselFaultExperiment> self;
   std::shared_ptr<const QZTesselFrameDescription> frame;
@@ -55,8 +55,8 @@ void QZTesselFaultExperiment::_handleEvent(std::int32_t event, MediaTime time, c
   });
 }
 
-// The reference that the frame handler took is given back in one place, when the frame is handed on. The paths that end
-// before it keep the buffer, deliberately.
+// The frame handler's reference to the buffer is released in one place, when the frame is passed on. The paths that end
+// earlier keep the reference deliberately.
 void QZTesselFaultExperiment::_takeIn(std::shared_ptr<QZTesselFaultExperiment> self, PixelBuffer& buffer,
                                       MediaTime time) {
   if (self->_stop) {
@@ -84,7 +84,7 @@ void QZTesselFaultExperiment::_takeIn(std::shared_ptr<QZTesselFaultExperiment> s
     return;
   }
   buffer.release();
-  // The task may run, and drop the experiment with its queues, before async returns.
+  // The task may run and destroy the experiment with its queues before async() returns.
   const std::shared_ptr<SerialQueue> processing = self->_processingQueue;
   processing->async(Examination{std::move(self), std::move(frame), number});
 }

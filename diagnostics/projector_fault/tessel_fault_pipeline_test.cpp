@@ -1,4 +1,4 @@
-// What a run makes of the frames and events that come to it.
+// The handling of frames and events during a run.
 #include "backends/simulated/simulated_phone.h"
 #include "backends/simulated/time/simulation_stall.h"
 #include "diagnostics/projector_fault/tessel_fault_experiment.h"
@@ -20,8 +20,8 @@
 namespace quazor {
 namespace {
 
-// Puts the lines of frames that came after the stop where the bench watches: whether the run has returned when such a
-// frame is taken in is a matter of luck.
+// Moves the log lines of frames after the stop to the section "afterwards": whether the run has already returned when
+// such a frame arrives depends on the order of events.
 std::string withLateFramesAfterwards(std::string told) {
   constexpr std::string_view kLate = "log default: Received frame that won't be counted";
   std::string late;
@@ -34,7 +34,7 @@ std::string withLateFramesAfterwards(std::string told) {
   return told.insert(told.find(kAfterwards) + kAfterwards.size(), late);
 }
 
-// The run from the start of the stream on, whatever order the seeds stand for.
+// The trace of the run from the start of the stream, which must be equal for all seeds.
 std::string toldOfFrames(const Scenario& scenario, ProjectorRequest request = {}) {
   constexpr std::string_view kStart = "front-infrared start\n";
   std::string first;
@@ -119,7 +119,7 @@ TEST(TesselFaultPipeline, EndsWithAFrameThatIsDarkForNoKnownReason) {
                 kEnd + "buffers held: none\n");
 }
 
-// The last frame is judged like every other, and errors count more than the frame number.
+// The last frame is examined like every other, and its error takes precedence over its number.
 TEST(TesselFaultPipeline, EndsWithAnErrorWhenTheLastFrameIsDark) {
   const std::string told = toldOfFrames(withFrame(3, unlitFrame()));
   EXPECT_NE(told.find("error QZCapturePlugInErrorDomain code 206: Frame 3 is not illuminated for unknown reason!\n"),
@@ -128,7 +128,7 @@ TEST(TesselFaultPipeline, EndsWithAnErrorWhenTheLastFrameIsDark) {
   EXPECT_EQ(told.find("is the last frame."), std::string::npos) << told;
 }
 
-// Its frame is counted and its buffer never given back.
+// The frame is counted and its buffer is never released.
 struct BadMetadata {
   const char* name;
   FrameMetadata metadata;
@@ -330,8 +330,8 @@ TEST(TesselFaultPipeline, EndsAtOnceWithoutTimeToWait) {
   }
 }
 
-// A nanosecond less than a whole one is cut off: frame 3 comes 100 ms after the start, and so does the timeout of
-// 0.1 s; one of a nanosecond less is earlier than the frame, one of a nanosecond more is later.
+// Fractions of a nanosecond are truncated. Frame 3 arrives 100 ms after the start, like the timeout of 0.1 s; a timeout
+// one nanosecond shorter precedes the frame, one nanosecond longer follows it.
 TEST(TesselFaultPipeline, CountsItsTimeoutInWholeNanoseconds) {
   const struct {
     const char* name;
@@ -378,7 +378,7 @@ TEST(TesselFaultPipeline, LogsFramesThatComeAfterTheStopAndKeepsTheirBuffers) {
   EXPECT_EQ(toldOfFrames(scenario), want);
 }
 
-// The first of them ends the run; the others are not counted any more, whatever is wrong with them.
+// The first error ends the run; the other frames are no longer counted.
 TEST(TesselFaultPipeline, KeepsTheFirstErrorOfMany) {
   Scenario scenario = projectorScenario();
   infraredCamera(scenario).projector->metadata = attached(FrameAttachment::kMissing);

@@ -1,4 +1,4 @@
-// Runs for other ports, formats and parameters than the usual ones, and errors that a call left behind.
+// Runs with unusual ports, formats and parameters, and with errors stored by successful calls.
 #include "diagnostics/projector_fault/tessel_fault_experiment.h"
 
 #include "backends/simulated/simulated_phone.h"
@@ -46,7 +46,7 @@ TEST_F(TesselFaultRunEdges, StreamsThePortItWasMadeFor) {
       told.starts_with("service defaultPlugIn\nplug-in get device\ndevice get streams\nfront get PortType\n"
                        "device request control (front)\n"))
       << told;
-  // It has no projector to configure.
+  // This camera has no projector.
   expectContains(told,
                  "front set InfraredLightSourceConfiguration = {Mode = 2; StructuredLightCurrent = 0; "
                  "StructuredLightPattern = 1} -> failed\n");
@@ -111,8 +111,7 @@ TEST_F(TesselFaultRunEdges, ReplacesTheErrorOfAStreamWithoutAPortWhenItFails) {
       << told;
 }
 
-// A service whose calls leave an error behind with every success and none with a failure; its stream refuses a
-// property, or to start.
+// A service that stores an error on every success and none on a failure; its stream rejects a property, or start().
 std::shared_ptr<CaptureService> makeMisleadingCapture(const std::string& refused) {
   const CaptureScript mislead = [](const ScriptedCall& call) {
     if (call.operation == "stop") {

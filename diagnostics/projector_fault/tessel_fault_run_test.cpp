@@ -1,4 +1,4 @@
-// Whole runs on a simulated phone: a healthy one, and one for every call that can fail.
+// Complete runs on a simulated phone: a healthy one, and one for every call that can fail.
 #include "diagnostics/projector_fault/tessel_fault_experiment.h"
 
 #include "tests/sweeps/projector_bench.h"
@@ -66,7 +66,7 @@ buffers held: none
 )";
 
 constexpr const char* kTimeoutLater = "log error: Timeout has been reached.\n";
-// A stream that would not stop goes on until the device is invalidated.
+// A stream whose stop failed continues until the device is invalidated.
 constexpr const char* kFramesAndTimeoutLater = R"(log default: Received frame that won't be counted at time: 0.133333334
 log default: Received frame that won't be counted at time: 0.166666667
 log default: Received frame that won't be counted at time: 0.2
@@ -74,14 +74,14 @@ log error: Timeout has been reached.
 log default: Received frame that won't be counted at time: 0.233333334
 )";
 
-// A call that fails, which ends the run.
+// A failing call that ends the run.
 struct FailingStep {
   const char* name;
   const char* operation;
   std::optional<std::string> property;
   std::uint64_t occurrence;
   const char* line;   // the call in the healthy run
-  const char* error;  // what the run gives; {cause} stands for the call's error
+  const char* error;  // the resulting error; {cause} is replaced by the error of the call
   const char* underway = "";
   const char* afterwards = "";
   const char* teardown = "device invalidate\ntorn down\nerror untouched\n";
@@ -185,7 +185,7 @@ Fault faultOn(const char* operation, std::optional<std::string> property, std::u
   return fault;
 }
 
-// With a place for an error and without one, and whatever order the seeds stand for.
+// Checks the trace with and without an error variable and for several seeds.
 void expectTold(const std::string& told, const Scenario& scenario, const std::vector<Fault>& faults) {
   for (const std::uint64_t seed : {1U, 2U, 3U}) {
     ProjectorRequest request;
@@ -219,7 +219,7 @@ TEST_P(FailingTesselFaultRun, IsToldExactly) {
 INSTANTIATE_TEST_SUITE_P(Steps, FailingTesselFaultRun, testing::ValuesIn(kSteps),
                          [](const testing::TestParamInfo<FailingStep>& step) { return step.param.name; });
 
-// Its error stays where it was written.
+// The error of the failed call remains stored.
 TEST(TesselFaultRun, GoesOnBehindAStreamThatTellsNoPort) {
   for (const bool hasError : {true, false}) {
     std::string told = kHealthyRun;

@@ -1,4 +1,4 @@
-// How a projector fault experiment is made, described, set up and torn down. No test here runs it.
+// Creation, description, setup and teardown of the projector fault experiment, without a run.
 #include "diagnostics/projector_fault/tessel_fault_experiment.h"
 
 #include "diagnostics/projector_fault/fixed_clock_for_tests.h"
@@ -25,7 +25,7 @@ using testing::ElementsAre;
 using testing::IsEmpty;
 using testing::UnorderedElementsAre;
 
-// Every call that reached a service, in order.
+// All calls to the services, in order.
 using Calls = std::vector<std::string>;
 
 class FakeQueue final : public SerialQueue {
@@ -97,7 +97,7 @@ class TesselFaultExperimentSetup : public testing::Test {
   std::shared_ptr<QZTesselFaultExperiment> makeExperiment() const {
     return std::make_shared<QZTesselFaultExperiment>(platform);
   }
-  // One whose making left no trace in `calls`, with `device` and a stream.
+  // An experiment with `device` and a stream; `calls` is empty afterwards.
   std::shared_ptr<QZTesselFaultExperiment> makeOpenExperiment() const {
     auto experiment = makeExperiment();
     experiment->setDevice(device);
@@ -108,7 +108,7 @@ class TesselFaultExperimentSetup : public testing::Test {
 
   const std::shared_ptr<Calls> calls = std::make_shared<Calls>();
   bool invalidates = true;
-  DiagnosticErrorPtr invalidateError;  // stored by invalidate(), however it ends
+  DiagnosticErrorPtr invalidateError;  // stored by invalidate() whether it succeeds or fails
   const CaptureScript script = [this](const ScriptedCall& call) {
     calls->push_back(std::string(call.operation));
     if (call.operation != "invalidate") return false;
@@ -215,7 +215,7 @@ TEST_F(TesselFaultExperimentSetup, RefusesNegativeParametersAndNoOthers) {
   const struct {
     const char* name;
     Dictionary parameters;
-    const char* want;  // null when they pass
+    const char* want;  // null if they are valid
   } rows[] = {
       {"usual values", {{"frameCount", 100}, {"timeout", 10.5}}, nullptr},
       {"zeros", {{"frameCount", 0}, {"timeout", 0}}, nullptr},
@@ -308,7 +308,7 @@ TEST_F(TesselFaultExperimentSetup, FailsItsTeardownWithTheDevicesErrorWhereItGav
   EXPECT_THAT(*calls, ElementsAre("invalidate"));
 }
 
-// What the caller's place held before caused nothing.
+// An error that the caller's variable contained before is not the cause.
 TEST_F(TesselFaultExperimentSetup, FailsItsTeardownWithoutAnUnderlyingErrorWhereTheDeviceGaveNone) {
   invalidates = false;
   DiagnosticErrorPtr error = earlier;

@@ -66,7 +66,7 @@ bool QZTesselFrameDescription::fill(std::uint64_t monotonicCount, MediaTime pres
                                     const Dictionary& metadata) {
   _monotonicCount = monotonicCount;
   _presentationTime = presentationTime;
-  auto next = metadata.begin();  // where the number is when the service lists them in this order, as it mostly does
+  auto next = metadata.begin();  // where the number is if the service lists them in this order, which it usually does
   for (std::size_t i = 0; i < kNumberCount; ++i) {
     const bool isNext = next != metadata.end() && next->first == kMetadataKeys[i];
     const Value* number = isNext ? &next++->second : metadata.find(kMetadataKeys[i]);

@@ -30,7 +30,7 @@ class QZTesselFrameDescription final : public Object {
   // A default record: number 0, time 0, created now, floodActiveTemperature absent, all other numbers the integer 0.
   explicit QZTesselFrameDescription(const Clock& clock = *installedPlatform().clock);
 
-  // For the functions below: a record without numbers, which fill() gives it.
+  // For the functions below: a record whose numbers fill() sets.
   class Unfilled {
     friend class QZTesselFrameDescription;
     Unfilled() = default;
@@ -42,14 +42,14 @@ class QZTesselFrameDescription final : public Object {
   static std::shared_ptr<const QZTesselFrameDescription> descriptionWithMonotonicCount(
       std::uint64_t monotonicCount, MediaTime presenationTime, const Dictionary& metadata,
       const Clock& clock = *installedPlatform().clock);
-  // The same, in memory of `pool`, which must outlive it.
+  // The same, allocated from `pool`, which must outlive it.
   static std::shared_ptr<const QZTesselFrameDescription> descriptionWithMonotonicCount(std::uint64_t monotonicCount,
                                                                                        MediaTime presenationTime,
                                                                                        const Dictionary& metadata,
                                                                                        const Clock& clock,
                                                                                        RecordPool& pool);
 
-  // The frame's number, from 1.
+  // The number of the frame, starting at 1.
   std::uint64_t monotonicCount() const { return _monotonicCount; }
   void setMonotonicCount(std::uint64_t count) { _monotonicCount = count; }
   MediaTime presentationTime() const { return _presentationTime; }
@@ -92,7 +92,7 @@ class QZTesselFrameDescription final : public Object {
   void setDIETemperatureStandby(const Number& number) { set(kDIETemperatureStandby, number); }
   Number DIETemperatureActive() const { return _numbers[kDIETemperatureActive].value(); }
   void setDIETemperatureActive(const Number& number) { set(kDIETemperatureActive, number); }
-  // A set of 16 event flags.
+  // 16 event flags.
   Number hardwareEvents() const { return _numbers[kHardwareEvents].value(); }
   void setHardwareEvents(const Number& number) { set(kHardwareEvents, number); }
 
@@ -105,7 +105,7 @@ class QZTesselFrameDescription final : public Object {
   bool safetyDisabledProjection() const;
 
  private:
-  // In the order in which they are read from the metadata and stand in the CSV line.
+  // In the order of reading from the metadata and of the CSV line.
   enum NumberIndex : std::size_t {
     kProjectorMode,
     kInfraredLightSource,
@@ -136,7 +136,7 @@ class QZTesselFrameDescription final : public Object {
       _numbers[index].reset();
     }
   }
-  // False when a number is missing.
+  // False if a number is missing.
   bool fill(std::uint64_t monotonicCount, MediaTime presentationTime, const Dictionary& metadata);
 
   std::uint64_t _monotonicCount = 0;

@@ -23,7 +23,7 @@ namespace {
 
 using FrameRecord = QZTesselFrameDescription;
 
-// The numbers of a record, each with its key in the metadata and a value of its own, in the order of the CSV line.
+// The numbers of a record with their metadata keys and distinct values, in the order of the CSV line.
 const struct NumberProperty {
   std::string_view key;
   FrameRecord::Number (FrameRecord::*get)() const;
@@ -56,7 +56,7 @@ const struct NumberProperty {
 };
 static_assert(std::size(kNumbers) == 18);
 
-// A value of every kind that is a number, and one of every kind that is none.
+// A value of every numeric kind, and one of every other kind.
 Array valuesOfNumberKinds() {
   return {true, -3, std::numeric_limits<std::uint64_t>::max(), std::numeric_limits<std::int64_t>::min(), 36.6, 36.6F};
 }

@@ -1,4 +1,4 @@
-// Filters for the report channels that the diagnostics use.
+// Filters for the report channels of the diagnostics.
 #pragma once
 
 #include "platform/report_facility.h"

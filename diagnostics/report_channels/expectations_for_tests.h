@@ -1,4 +1,4 @@
-// What the tests of report channels and of projector faults expect alike.
+// Expectations shared by the tests of report channels and of projector faults.
 #pragma once
 
 #include "contract/diagnostic_error.h"
@@ -13,7 +13,7 @@
 
 namespace quazor {
 
-// The channels of a sound depth camera module, in their order: those of the healthy phone.
+// The channels of a healthy depth camera module, in order, as on the healthy phone.
 inline const std::vector<std::string>& moduleChannels() {
   static const std::vector<std::string> kNames = [] {
     std::vector<std::string> names;
@@ -25,7 +25,7 @@ inline const std::vector<std::string>& moduleChannels() {
   return kNames;
 }
 
-// A result in which every channel of the module counted nothing.
+// A result in which all channels of the module are 0.
 inline QZExperimentResult resultOfQuietModule() {
   QZExperimentResult result;
   for (const std::string_view name : moduleChannels()) {
@@ -43,7 +43,7 @@ inline std::string told(const std::shared_ptr<const QZBound>& bound) {
   return told(bound->value()) + (bound->open() ? " open" : " closed");
 }
 
-// NAME = VALUE UNIT [LIMIT: LOWER to UPPER]
+// Formats as NAME = VALUE UNIT [LIMIT: LOWER to UPPER].
 inline std::string told(const QZMeasuredResult& measured) {
   std::string text = measured.name() + " = " + told(measured.measurement());
   if (const auto& limit = measured.limit()) {
@@ -52,14 +52,14 @@ inline std::string told(const QZMeasuredResult& measured) {
   return text;
 }
 
-// Every measured result on a line of its own.
+// One line per measured result.
 inline std::string told(const QZAnalysisResult& result) {
   std::string text;
   for (const QZMeasuredResult& measured : result.measuredResults()) text += told(measured) + '\n';
   return text;
 }
 
-// Every measurement on a line of its own, and then the auxiliary data.
+// One line per measurement, then the auxiliary data.
 inline std::string told(const QZExperimentResult& result) {
   std::string text;
   for (const auto& [name, measurement] : result.measurements()) text += name + " = " + told(measurement) + '\n';
@@ -67,7 +67,7 @@ inline std::string told(const QZExperimentResult& result) {
   return text;
 }
 
-// DOMAIN CODE MESSAGE, and every entry of the user info that is not the message.
+// DOMAIN CODE MESSAGE, and all other entries of the user info.
 inline std::string told(const DiagnosticErrorPtr& error) {
   if (error == nullptr) return "none";
   std::string text = error->domain() + ' ' + std::to_string(error->code()) + ' ' + error->localizedDescription();
@@ -77,7 +77,7 @@ inline std::string told(const DiagnosticErrorPtr& error) {
   return text;
 }
 
-// Whether a measurement lies within the bounds that its limit has; a closed bound belongs to its range.
+// True if the measurement lies within the bounds of its limit; closed bounds are included.
 inline bool isInside(const QZMeasuredResult& measured) {
   const double value = measured.measurement().value();
   const auto& lower = measured.limit().value().lowerBound();
@@ -89,7 +89,7 @@ inline bool isInside(const QZMeasuredResult& measured) {
   return highEnough && lowEnough;
 }
 
-// What a caller had in its place for errors before a call; only a failure may touch it.
+// The previous content of a caller's error variable, which only a failure may change.
 inline DiagnosticErrorPtr earlierError() { return makeError("CallerErrorDomain", 1, "Here before."); }
 
 }  // namespace quazor

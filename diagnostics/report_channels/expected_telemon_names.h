@@ -6,8 +6,8 @@
 
 namespace quazor {
 
-// The names of the fault latches and thermistors of the module, 60 of them, all different, in a fixed order. Each call
-// returns a new list; the texts live for ever. Any thread.
+// The names of the fault latches and thermistors of the module: 60 different names in a fixed order. Each call returns
+// a new list; the texts are never destroyed. Any thread.
 std::vector<std::string_view> expectedTelemonNames();
 
 }  // namespace quazor

@@ -28,7 +28,7 @@ std::uint64_t digestOf(const std::vector<std::string_view>& names) {
   return digest;
 }
 
-// The list and the healthy phone agree on a slip that was made in both; the digest is of neither.
+// Detects a mistake that was made in both the list and the healthy phone, because the digest is independent of them.
 TEST(ExpectedTelemonNames, HaveTheDigestOfTheModulesNames) {
   EXPECT_EQ(digestOf(expectedTelemonNames()), 0x50B3B86CB83EA2A2U);
 }

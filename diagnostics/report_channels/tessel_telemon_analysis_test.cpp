@@ -11,7 +11,7 @@
 namespace quazor {
 namespace {
 
-// The results of a quiet module, as text.
+// The results of a module whose channels are all 0, as text.
 std::string quietResults() {
   std::string text;
   for (const std::string_view name : moduleChannels()) {

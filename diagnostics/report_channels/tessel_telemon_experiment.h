@@ -9,7 +9,7 @@
 namespace quazor {
 
 // The result contains one measurement per channel: its count, in events, under the channel's name. If two channels have
-// the same name, the later one is kept. Without channels the result is empty.
+// the same name, the later one applies. Without channels the result is empty.
 // Thread: the host's, as QZExperiment.
 class QZTesselTelemonExperiment final : public QZExperiment {
  public:

@@ -25,13 +25,13 @@ struct Channel {
 };
 using Channels = std::vector<Channel>;
 
-// What a facility has, how its calls end, and which calls came.
+// The channels of a facility, the outcome of its calls, and a list of the calls.
 struct FacilityState {
   Channels channels;
   bool hasSet = true;
   bool hasSnapshot = true;
-  DiagnosticErrorPtr setError;       // stored by the call for the set, however it ends
-  DiagnosticErrorPtr snapshotError;  // stored by the call for a snapshot, however it ends
+  DiagnosticErrorPtr setError;       // stored by the call for the set whether it succeeds or fails
+  DiagnosticErrorPtr snapshotError;  // stored by the call for a snapshot whether it succeeds or fails
   std::vector<std::string> calls;
 };
 
@@ -241,7 +241,7 @@ TEST_F(TesselTelemonExperiment, FailsAtTheFirstChannelWithoutACount) {
   EXPECT_EQ(told(error), "QZTelemonErrorDomain 100 Could not get the count of Number KT %@ %d.");
 }
 
-// An error that the caller, or a call that succeeded, left behind caused nothing.
+// An error that was stored before the call, or by a successful call, is not the cause.
 TEST_F(TesselTelemonExperiment, GivesNoUnderlyingErrorThatTheFailedCallDidNotGive) {
   DiagnosticErrorPtr error = earlier;
   facility->hasSet = false;

@@ -1,4 +1,4 @@
-// Whole runs on a simulated phone: healthy ones, and one for every call that can fail.
+// Complete runs on a simulated phone: healthy ones, and one for every call that can fail.
 #include "diagnostics/report_channels/tessel_telemon_experiment.h"
 
 #include "backends/simulated/simulated_phone.h"
@@ -34,7 +34,7 @@ Scenario scenarioOf(std::vector<ReportChannelConfig> channels) {
   return scenario;
 }
 
-// Six channels, of which the presence report has the first three.
+// Six channels; the presence report includes the first three.
 std::vector<ReportChannelConfig> sixChannels() {
   return {channel("K42ISP", "K42ISP Events", "Number Fenk NTC", 3),
           channel("The K42ISP of old", "K42ISP Events of old", "Number ZE FAULT_A", 0),

@@ -21,7 +21,7 @@ constexpr std::uint32_t reversed(std::uint32_t number) {
 }
 static_assert(reversed(0x12345678) == 0x78563412);
 
-// A number that was copied from the record, in the byte order of this machine.
+// Converts a number from the record's byte order to that of this machine.
 constexpr std::uint32_t inOwnOrder(std::uint32_t number) {
   return std::endian::native == std::endian::little ? number : reversed(number);
 }
@@ -45,7 +45,7 @@ QZNimbeCorvaneImage::QZNimbeCorvaneImage(RecordBytes record)
       _tmonDataInC(std::bit_cast<float>(numberAt(record, kTemperatureOffset))),
       _timestampInMilliseconds(numberAt(record, kTimestampOffset)) {}
 
-// In one piece: most machines have the record's byte order, and the compiler drops the loop there.
+// Copies all samples at once: on most machines the conversion does nothing, and the compiler removes the loop.
 QZNimbeCorvaneImage::Scan::Scan(std::span<const std::uint8_t, 4 * kNimbeScanSize> bytes) {
   std::memcpy(samples_.data(), bytes.data(), sizeof samples_);
   for (std::int32_t& sample : samples_) {

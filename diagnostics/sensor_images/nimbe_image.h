@@ -12,7 +12,7 @@
 
 namespace quazor {
 
-// The record is a whole input report with ID 0x76, the byte of the ID first, packed and little-endian:
+// The record is a complete input report with ID 0x76, beginning with the ID byte, packed and little-endian:
 //
 //   offset  size
 //        0     1  report ID
@@ -44,7 +44,7 @@ class QZNimbeCorvaneImage {
   // An unsigned number.
   const Value& frameID() const { return _frameID; }
   void setFrameID(Value frameID) { _frameID = std::move(frameID); }
-  // 48 signed numbers each, in the order of the samples: in phase, and in quadrature.
+  // 48 signed numbers each, in sample order: in phase, and in quadrature.
   Array dScanI() const { return _dScanI.array(); }
   void setDScanI(Array samples) { _dScanI.replace(std::move(samples)); }
   Array dScanQ() const { return _dScanQ.array(); }

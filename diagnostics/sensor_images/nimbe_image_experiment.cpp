@@ -15,14 +15,14 @@ constexpr std::string_view kImagesParameter = "images";
 constexpr std::string_view kTimeoutParameter = "timeout";
 constexpr std::string_view kImagesEntry = "images";
 
-// Where the framebuffer's driver publishes whether the panel has power.
+// The property in which the framebuffer driver reports the power of the panel.
 constexpr std::string_view kDisplayProperty = "DSPLY Debug Info";
 constexpr std::string_view kPowerInfo = "DSPLY power info";
 constexpr std::string_view kPanelPower = "DSPLY power info panel";
 
 constexpr std::int64_t kObserverOrder = 0;
 
-// An observer that is added for as long as this lives, also when an exception ends the run.
+// Adds an observer for its own lifetime, so that it is removed even if an exception ends the run.
 class AddedObserver {
  public:
   AddedObserver(RunLoop& loop, std::shared_ptr<RunLoopObserver> observer)
@@ -105,7 +105,7 @@ bool QZNimbeImageExperiment::displayIsPowered(DiagnosticErrorPtr* error) const {
 }
 
 std::unique_ptr<QZExperimentResult> QZNimbeImageExperiment::run(DiagnosticErrorPtr* error) {
-  if (_runLoop == nullptr) {  // it was not set up
+  if (_runLoop == nullptr) {  // setup was not called
     failWithoutRunLoop(error);
     return nullptr;
   }
@@ -130,7 +130,7 @@ std::unique_ptr<QZExperimentResult> QZNimbeImageExperiment::run(DiagnosticErrorP
   return _buildResult();
 }
 
-// Closes the stream when the run is over.
+// An observer that closes the stream at the end of the run.
 std::shared_ptr<RunLoopObserver> QZNimbeImageExperiment::_makeObserver() {
   const auto closeAtExit = [experiment = weak_from_this()](RunLoopActivities activity) {
     if (activity != kRunLoopExit) return;

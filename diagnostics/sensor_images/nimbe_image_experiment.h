@@ -19,8 +19,8 @@ namespace quazor {
 //
 // Must be owned by a std::shared_ptr: the stream and the loop's observer hold it weakly.
 //
-// Thread: one; setup and run on the same, whose loop calls everything else during the run. After the run the stream
-//   stays referenced, closed.
+// Thread: one; setup and run on the same one, whose loop makes all other calls during the run. After the run the stream
+// stays referenced, closed.
 class QZNimbeImageExperiment final : public QZExperiment,
                                      public QZNimbeImageStreamDelegate,
                                      public std::enable_shared_from_this<QZNimbeImageExperiment> {

@@ -1,4 +1,4 @@
-// Whole runs, call by call: the healthy one, and one for every step that can fail.
+// Complete runs, call by call: the healthy one, and one for every step that can fail.
 #include "contract/message_format.h"
 #include "diagnostics/sensor_images/nimbe_image_experiment.h"
 #include "tests/support/hand_made_sensor.h"

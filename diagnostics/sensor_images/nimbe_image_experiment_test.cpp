@@ -1,4 +1,4 @@
-// What the experiment says of itself, what it is set up with, and what it holds on to.
+// The experiment's description, setup and lifetime.
 #include "diagnostics/sensor_images/nimbe_image_experiment.h"
 
 #include "tests/support/hand_made_sensor.h"
@@ -38,11 +38,11 @@ class NimbeImageExperiment : public testing::Test {
     (void)calls();
     return experiment;
   }
-  // A report while the loop waits, that many milliseconds after the beginning.
+  // Delivers a report while the loop waits, that many milliseconds after the start.
   void imageAt(int time, std::uint32_t frameID) {
     sensor.loop.at(milliseconds(time), [this, frameID] { sensor.device->send(0x76, imageReport(frameID)); });
   }
-  // What was called since the last time.
+  // The calls since the previous call of this function.
   std::string calls() {
     const std::string all = transcript.text();
     return all.substr(std::exchange(seen_, all.size()));
@@ -150,7 +150,7 @@ TEST_F(NimbeImageExperiment, ReadsThePowerOfTheDisplayAsABoolean) {
   const struct {
     const char* name;
     Value property;
-    std::string message;  // empty for a powered display
+    std::string message;  // empty if the display has power
   } rows[] = {
       {"one", displayPropertyOf(1), ""},
       {"true", displayPropertyOf(true), ""},
@@ -269,7 +269,7 @@ TEST_F(NimbeImageExperiment, ReturnsWhatItHasWhenSomebodyElseStopsTheLoop) {
 
 TEST_F(NimbeImageExperiment, KeepsAnImageThatComesWhileTheStreamIsOpened) {
   const auto experiment = makeFor(2, 1);
-  // Before the stream's loop runs, as a device may do that answers its feature reports with an image.
+  // Delivered before the loop runs, by a device that responds to a feature report with an image.
   sensor.loop.at(milliseconds(1), [this] { sensor.device->send(0x76, imageReport(2)); });
   sensor.device->careless = true;
   sensor.device->onFeatureReport = [this](std::uint8_t reportID) {
@@ -347,7 +347,7 @@ TEST_F(NimbeImageExperiment, GivesUpItsObserverWhateverEndsTheRun) {
   }
 }
 
-// The loop may tell an observer of its exit once more than the run's owner lives to see.
+// The loop may notify an observer of its exit after the experiment was released.
 TEST_F(NimbeImageExperiment, IsHeldWeaklyByItsObserverAndItsStream) {
   auto experiment = makeFor(1, 1);
   const std::weak_ptr<QZNimbeImageExperiment> watched = experiment;

@@ -11,11 +11,11 @@ namespace quazor {
 
 namespace {
 
-// The sensor's usage, in a page that the HID usage tables leave to vendors.
+// The sensor's usage, in a vendor-defined page of the HID usage tables.
 constexpr std::uint64_t kUsagePage = 0xFF00;
 constexpr std::uint64_t kUsage = 0x24;
 
-// Its feature reports, each with the byte of its ID first.
+// Its feature reports, each beginning with its ID.
 constexpr std::array<std::uint8_t, 2> kPowerModeActive{0xAB, 0x01};
 constexpr std::array<std::uint8_t, 2> kStreamingModeImagesOnly{0xAC, 0x01};
 
@@ -92,7 +92,7 @@ void QZNimbeImageStream::processInputReportWithID(std::uint8_t reportID, std::sp
     if (delegate != nullptr) delegate->streamDidError(std::move(error));
     return;
   }
-  // A report that was cut short has no image.
+  // A truncated report contains no image.
   if (reportID != kNimbeImageReportID || data.size() < kNimbeImageRecordSize) return;
   auto image = std::make_shared<QZNimbeCorvaneImage>(data.first<kNimbeImageRecordSize>());
   if (delegate != nullptr) delegate->handleImage(std::move(image));

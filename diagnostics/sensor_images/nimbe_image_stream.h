@@ -14,7 +14,7 @@
 namespace quazor {
 
 // Receives the images and errors of a stream, on the thread that runs the stream's loop.
-// Thread: that of the stream's run loop.
+// Thread: the one of the stream's run loop.
 class QZNimbeImageStreamDelegate {
  public:
   QZNimbeImageStreamDelegate() = default;
@@ -29,8 +29,8 @@ class QZNimbeImageStreamDelegate {
 
 // Must be owned by a std::shared_ptr: the device's callback holds it weakly, so it may be destroyed before the device.
 //
-// Thread: that of the run loop which it is opened with. Reports come there while the loop runs, and the delegate is
-//   called from inside them. It may close the stream, replace itself or drop the stream then.
+// Thread: the one of the run loop that it is opened with. Reports arrive while the loop runs, and the delegate is
+// called from their callback. It may then close the stream, replace itself or release the stream.
 class QZNimbeImageStream final : public std::enable_shared_from_this<QZNimbeImageStream> {
  public:
   explicit QZNimbeImageStream(Platform platform = installedPlatform());

@@ -35,13 +35,13 @@ class NimbeImageStream : public testing::Test {
  protected:
   NimbeImageStream() { stream->setDelegate(delegate); }
 
-  // Opens the stream; what was called since the beginning, what came of it, and the error.
+  // Opens the stream and returns the calls since the beginning, the outcome and the error.
   std::string open(ErrorPlace place = ErrorPlace::kGiven) {
     DiagnosticErrorPtr error = callersOwnError();
     const bool opened = stream->openWithRunLoop(sensor.loop, place == ErrorPlace::kGiven ? &error : nullptr);
     return transcript.text() + (opened ? "opened\n" : "not opened\n") + errorChain(error) + '\n';
   }
-  // What was called since the last time, or since the opening.
+  // The calls since the previous call of this function, or since open().
   std::string calls() {
     const std::string all = transcript.text();
     return all.substr(std::exchange(seen_, all.size()));
@@ -204,7 +204,7 @@ TEST_F(NimbeImageStream, TakesImageReportsOfAtLeastARecordAndNoOthers) {
     delegate->images.clear();
     Bytes report = imageReport(9);
     report.resize(row.size, 0xEE);
-    report.shrink_to_fit();  // nothing may be read behind it
+    report.shrink_to_fit();  // makes a read past the end detectable
     sensor.device->deliver(row.reportID, report);
     EXPECT_EQ(delegate->images.size(), row.taken ? 1U : 0U) << row.name;
     for (const auto& image : delegate->images) EXPECT_EQ(image->frameID(), Value(9U)) << row.name;
@@ -213,7 +213,7 @@ TEST_F(NimbeImageStream, TakesImageReportsOfAtLeastARecordAndNoOthers) {
   EXPECT_EQ(calls(), "");
 }
 
-// The byte in the data is the device's business.
+// The ID that the device passes applies, not the byte in the data.
 TEST_F(NimbeImageStream, GoesByTheIDThatTheDeviceTells) {
   openQuietly();
   Bytes report = imageReport(1);
@@ -233,7 +233,7 @@ TEST_F(NimbeImageStream, ClosesBeforeItHandsOnTheErrorOfADevice) {
     EXPECT_FALSE(sensor.device->isOpen());
   };
   sensor.device->deliver(0x76, imageReport(1));
-  sensor.device->deliverError(std::move(error));  // which the device forgets when it is closed
+  sensor.device->deliverError(std::move(error));  // the device releases it when it is closed
   ASSERT_EQ(delegate->errors.size(), 1U);
   EXPECT_EQ(delegate->errors.front(), watched.lock());
   EXPECT_EQ(errorChain(delegate->errors.front()), "BenchErrorDomain code 7: Unplugged.");

@@ -24,7 +24,7 @@ std::string differences(const QZNimbeCorvaneImage& a, const QZNimbeCorvaneImage&
   return names;
 }
 
-// Four bytes, from the offset on.
+// Four bytes at an offset.
 struct Patch {
   std::size_t offset;
   std::array<std::uint8_t, 4> bytes;
@@ -112,7 +112,7 @@ TEST(NimbeCorvaneImage, KeepsTheTemperatureAsA32BitFloat) {
   EXPECT_TRUE(std::isnan(*unreadable.tmonDataInC().floatNumber()));
 }
 
-// Every byte of the record has one meaning at most.
+// No byte of the record belongs to two properties.
 TEST(NimbeCorvaneImage, ReadsEachPropertyFromItsOwnBytes) {
   const auto meaning = [](std::size_t offset) -> std::string {
     if (offset >= 4 && offset < 8) return "frameID ";

@@ -1,4 +1,4 @@
-// A plug-in of one's own: how late does the platform's clock wake a thread that sleeps?
+// An example plug-in: measures how late the platform's clock wakes a sleeping thread.
 #include "contract/diagnostic_contract.h"
 #include "contract/lab.h"
 #include "platform/platform.h"
@@ -13,15 +13,15 @@ namespace {
 using namespace quazor;
 
 constexpr std::string_view kLateness = "Lateness";
-constexpr int kBadParameterValue = 5;   // of QZErrorDomain, for all plug-ins
-constexpr int kMissingMeasurement = 6;  // likewise
+constexpr int kBadParameterValue = 5;   // of QZErrorDomain, shared by all plug-ins
+constexpr int kMissingMeasurement = 6;  // the same
 constexpr std::string_view kSleepAccuracyErrorDomain = "SleepAccuracyErrorDomain";
 constexpr int kClockStoodStill = 1;  // of the domain above
 
-// A unit is known by its symbol; there need not have been one before.
+// A symbol identifies a unit, which is created on first use.
 const QZUnit& milliseconds() { return QZUnit::unitWithSymbol("ms"); }
 
-// Sleeps once, and measures by how much longer that took than it should have.
+// Sleeps once and measures how much longer that took than requested.
 class SleepAccuracyExperiment final : public QZExperiment {
  public:
   explicit SleepAccuracyExperiment(const Platform& platform = installedPlatform()) : clock_(platform.clock) {}
@@ -34,7 +34,7 @@ class SleepAccuracyExperiment final : public QZExperiment {
 
   bool setupWithParameters(const Dictionary& parameters, QZDiagnosticHost*, DiagnosticErrorPtr* error) override {
     const double seconds = toDouble(parameters.find("duration"));
-    if (!(seconds >= 0.001)) {  // not-a-number is refused too
+    if (!(seconds >= 0.001)) {  // also rejects not-a-number
       fail(error, QZErrorDomain, kBadParameterValue, nullptr, "duration must be at least 0.001 s, not %@", seconds);
       return false;
     }
@@ -87,7 +87,7 @@ class SleepAccuracyAnalysis final : public QZAnalysis {
   }
 };
 
-// Loading the plug-in registers what it has.
+// Registers the plug-in's diagnostic when the plug-in is loaded.
 [[gnu::constructor]] void registerCatalogue() {
   QZLab& lab = QZLab::defaultLab();
   lab.addExperimentWithName("SleepAccuracyExperiment", [] { return std::make_shared<SleepAccuracyExperiment>(); });

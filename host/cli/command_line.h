@@ -41,7 +41,7 @@ inline constexpr std::string_view kCommandNames[] = {"list",   "describe", "run"
 // A parsed command line. Options that the command does not have keep their defaults.
 struct Options {
   std::vector<std::string> names;  // positional arguments: diagnostics or experiments, topics, a shell, "probe"
-  std::vector<std::filesystem::path> plugins;  // none: the installed one
+  std::vector<std::filesystem::path> plugins;  // empty: the installed one
   std::vector<ParameterOverride> settings;
   std::vector<std::filesystem::path> parameterFiles;
   std::vector<std::filesystem::path> records;  // to read
@@ -52,9 +52,9 @@ struct Options {
   std::filesystem::path phone;                 // a scenario, or linux:BINDING; empty: the installed healthy one
   ReportOptions report;
   std::vector<DeadlineSetting> deadlines;
-  std::optional<std::uint64_t> memory;  // of a process of a plug-in, in bytes; nothing: no limit
+  std::optional<std::uint64_t> memory;  // limit of a plug-in process, in bytes; nothing: no limit
   std::uint64_t seed = 0;
-  std::uint64_t seeds = 0;  // how many, from 0 on
+  std::uint64_t seeds = 0;  // the number of seeds, starting at 0
   std::optional<LogLevel> logLevel;
   Command command = Command::kList;
   bool all = false;

@@ -7,7 +7,7 @@
 
 namespace quazor {
 
-// An installation, found from the program's own place: PREFIX/bin/quazor. A build tree has the same layout.
+// An installation, found relative to the program: PREFIX/bin/quazor. A build tree has the same layout.
 // Thread: one at a time; any number may read while none writes.
 class Installation {
  public:
@@ -16,19 +16,19 @@ class Installation {
   // The installation of the running program.
   static Installation ofThisProgram();
 
-  // The plug-in that is loaded when none is named: the installed one or, where there is none, that beside the program.
+  // The plug-in that is loaded by default: the installed one or, if there is none, the one next to the program.
   std::filesystem::path defaultPlugin() const;
-  // All plug-ins in the place of the one above, by name.
+  // All plug-ins in the directory of defaultPlugin(), sorted by name.
   std::vector<std::filesystem::path> allPlugins() const;
   std::filesystem::path defaultProfile() const;
   std::filesystem::path defaultScenario() const;
   std::filesystem::path explanations() const;  // the directory of the explanations
-  // The file that `--phone` means by `name`: a file of that path if there is one, else the installed scenario of that
-  // name ("camera_sync/start_refused") if there is one, else the path as it stands.
+  // Resolves the argument of `--phone`: returns `name` if that file exists, else the installed scenario of that name
+  // (for example "camera_sync/start_refused") if there is one, else `name` unchanged.
   std::filesystem::path scenario(const std::filesystem::path& name) const;
-  // All installed scenarios, by the names that scenario() knows, in their order.
+  // The names of all installed scenarios, sorted, as scenario() accepts them.
   std::vector<std::string> scenarioNames() const;
-  // The same of the bindings that `--phone linux:NAME` means.
+  // Resolves the NAME of `--phone linux:NAME` in the same way, among the installed bindings.
   std::filesystem::path binding(const std::filesystem::path& name) const;
   std::vector<std::string> bindingNames() const;
 

@@ -1,6 +1,6 @@
-"""What the tests of the program's command line share.
+"""Helpers for the tests of the program's command line.
 
-CTest gives the program and the directory of the test plug-ins in the environment.
+CTest passes the program and the directory of the test plug-ins in the environment.
 """
 
 import json
@@ -16,7 +16,7 @@ PLUGINS = pathlib.Path(os.environ["QUAZOR_TEST_PLUGINS"])
 WORKING = str(PLUGINS / "working_plugin.so")
 EXPERIMENTS = str(PLUGINS / "experiments_plugin.so")
 
-# The record of the last run goes there, unless a test has a place of its own for it.
+# Default directory for the record of the previous run.
 STATE = tempfile.TemporaryDirectory()
 os.environ["XDG_STATE_HOME"] = STATE.name
 os.environ.pop("QUAZOR_SET", None)
@@ -39,14 +39,14 @@ def quazor(*arguments, **options):
 
 
 def start(*arguments, ignored=False, **options):
-    """The running program. Interrupts have their usual meaning in it, or are ignored, as in a shell's background."""
+    """Starts the program. SIGINT has its default action in it or, like in a background job of a shell, is ignored."""
     action = signal.SIG_IGN if ignored else signal.SIG_DFL
     return subprocess.Popen([PROGRAM, *map(str, arguments)], stdout=subprocess.PIPE, stderr=subprocess.PIPE, text=True,
                             preexec_fn=lambda: signal.signal(signal.SIGINT, action), **options)
 
 
 def events_in(record):
-    """The events of a record, which must be whole lines."""
+    """The events of a record; each line must be complete."""
     text = pathlib.Path(record).read_text()
     assert text.endswith("\n"), text[-100:]
     return [json.loads(line) for line in text.splitlines()]
@@ -77,7 +77,7 @@ class CommandLineTest(unittest.TestCase):
         self.assertEqual(result.returncode, 0, result.stdout + result.stderr)
 
     def assert_refused(self, result, code, *texts):
-        """The exit code, every text on standard error, nothing on standard output, and nothing touched."""
+        """Checks the exit code and each text on standard error; standard output must be empty and no device used."""
         self.assertEqual(result.returncode, code, result.stderr)
         self.assertTrue(result.stderr.startswith("quazor: "), result.stderr)
         for text in texts:

@@ -1,4 +1,4 @@
-"""The program as its users meet it: every kind of bad input, its outputs and its exit codes."""
+"""Invalid input of every kind, output and exit codes of the program."""
 
 import contextlib
 import json
@@ -34,7 +34,7 @@ class HelpTest(CommandLineTest):
 
 
 class RefusalTest(CommandLineTest):
-    """Before anything has been checked, nothing runs and no output file is made."""
+    """Invalid command lines: nothing runs and no output file is created."""
 
     def refuse(self, code, *texts, arguments=(), **options):
         self.assert_refused(self.run_fake("--output", self.output, *arguments, **options), code, *texts)
@@ -390,7 +390,7 @@ class RunTest(CommandLineTest):
 
 class TerminalTest(CommandLineTest):
     def run_on_terminal(self, env, *arguments, plugin=WORKING, diagnostic="Fake.One"):
-        """What the program writes to a terminal, standard output and error together."""
+        """Returns what the program writes to a terminal, on standard output and standard error."""
         environment = {key: value for key, value in os.environ.items() if key != "NO_COLOR"}
         environment.update(env)
         main, other = pty.openpty()
@@ -402,15 +402,15 @@ class TerminalTest(CommandLineTest):
         try:
             while chunk := os.read(main, 4096):
                 written += chunk
-        except OSError:  # the other end is closed
+        except OSError:  # the other end was closed
             pass
         os.close(main)
         process.wait(timeout=120)
         return written.decode()
 
     def run_until(self, run, check):
-        """What the first of ten runs writes that passes the check, or the last one's failure: what is shown depends on
-        how long a run takes, and a busy machine may take too long now and then."""
+        """Returns the first of ten outputs that passes the check; fails like the last one. The output depends on the
+        duration of a run, and a busy machine is sometimes too slow."""
         for _ in range(9):
             written = run()
             with contextlib.suppress(AssertionError):

@@ -17,7 +17,7 @@ namespace quazor {
 
 namespace {
 
-// Tells of the plug-ins that could not be loaded, and what that makes of the exit code.
+// Reports the plug-ins that could not be loaded and returns the resulting exit code.
 ExitCode reportFailed(const std::vector<FailedPlugin>& failed, Console& console, ExitCode otherwise) {
   for (const FailedPlugin& plugin : failed) {
     console.err << "quazor: " << printable(plugin.error->localizedDescription()) << '\n';
@@ -26,14 +26,14 @@ ExitCode reportFailed(const std::vector<FailedPlugin>& failed, Console& console,
 }
 
 ExitCode list(const Options& options, const Installation& installation, Console& console) {
-  // A diagnostic's summary is known without making anything of it.
+  // The summary of a diagnostic is known without a description; that of an experiment is not.
   const auto aloneAndUnused = [](std::vector<Diagnostic> all) {
     std::erase_if(all, [](const Diagnostic& one) { return !one.experimentOnly || !one.usedBy.empty(); });
     return all;
   };
-  const PluginScan survey = surveyOf(options, installation, aloneAndUnused);
+  const PluginScan scan = scanOf(options, installation, aloneAndUnused);
   std::vector<DescribedDiagnostic> listed;
-  for (const DescribedDiagnostic& one : survey.catalogue) {
+  for (const DescribedDiagnostic& one : scan.catalogue) {
     if (one.diagnostic.usedBy.empty()) listed.push_back(one);
   }
   std::ostringstream text;
@@ -43,7 +43,7 @@ ExitCode list(const Options& options, const Installation& installation, Console&
     printList(text, listed);
   }
   writeOutput(options.report, console, text.str());
-  return reportFailed(survey.failed, console, ExitCode::kAllPassed);
+  return reportFailed(scan.failed, console, ExitCode::kAllPassed);
 }
 
 ExitCode describe(const Options& options, const Installation& installation, Console& console) {
@@ -117,7 +117,7 @@ ExitCode runProgram(const std::vector<std::string>& arguments, const Installatio
     return perform(*options, installation, console);
   } catch (const CommandError& error) {
     return refused(error, error.code());
-  } catch (const InputError& error) {  // of a file that was read
+  } catch (const InputError& error) {  // from reading a file
     return refused(error, ExitCode::kCannotRead);
   }
 }

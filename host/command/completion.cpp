@@ -95,7 +95,7 @@ class Completer {
     return names;
   }
 
-  // Those of what the words name, or of everything.
+  // The parameters of the diagnostics that are named on the command line, or of all diagnostics.
   std::vector<std::string> parameters() const {
     std::set<std::string> names;
     for (const DescribedDiagnostic& one : catalogue(true)) {
@@ -112,7 +112,7 @@ class Completer {
     }
     try {
       std::vector<DescribedDiagnostic> all =
-          surveyOf(options, installation_, [described](const std::vector<Diagnostic>& everything) {
+          scanOf(options, installation_, [described](const std::vector<Diagnostic>& everything) {
             return described ? everything : std::vector<Diagnostic>();
           }).catalogue;
       std::vector<DescribedDiagnostic> named;

@@ -1,4 +1,4 @@
-// Completion of command lines in shells.
+// Shell completion of command lines.
 #pragma once
 
 #include "host/cli/installation.h"
@@ -9,14 +9,14 @@
 
 namespace quazor {
 
-// A shell's word with which the shells' scripts ask for candidates: quazor __complete WORD...
+// The hidden command that the completion scripts use to request candidates: quazor __complete WORD...
 inline constexpr std::string_view kCompletionRequest = "__complete";
 
-// The script that teaches the shell ("bash" or "zsh") to complete quazor's command lines.
+// The completion script for the shell ("bash" or "zsh").
 std::string completionScript(std::string_view shell);
 
-// What the last of the words, which may be empty, can be completed to; none where any file may stand. `words` are
-// without the program's name. What cannot be found out, because a plug-in cannot be loaded, is left out.
+// The candidates for the last word, which may be empty; none where any file name is allowed. `words` excludes the
+// program's name. Candidates that cannot be determined because a plug-in cannot be loaded are omitted.
 std::vector<std::string> completionsOf(const std::vector<std::string>& words, const Installation& installation);
 
 }  // namespace quazor

@@ -47,7 +47,7 @@ class Doctor {
   }
 
  private:
-  // `look` returns what there is, or throws the InputError that says what is wrong.
+  // `look` returns a description of what it found, or throws an InputError with the reason for the refusal.
   void check(std::string_view kind, const std::string& name, const std::function<std::string()>& look) {
     try {
       tell(true, kind, name, look());
@@ -62,23 +62,23 @@ class Doctor {
                  << printable(finding) << '\n';
   }
 
-  // Each is loaded alone, so that one that cannot be loaded does not hide another.
+  // Loads each plug-in alone: one that cannot be loaded must not hide another.
   std::string findingOfPlugin(const std::filesystem::path& plugin) const {
     Options alone = options_;
     alone.plugins = {plugin};
-    const PluginScan survey = surveyOf(alone, installation_, [](const std::vector<Diagnostic>& all) { return all; });
-    if (!survey.failed.empty()) {
-      throw CommandError(ExitCode::kCannotRead, survey.failed.front().error->localizedDescription());
+    const PluginScan scan = scanOf(alone, installation_, [](const std::vector<Diagnostic>& all) { return all; });
+    if (!scan.failed.empty()) {
+      throw CommandError(ExitCode::kCannotRead, scan.failed.front().error->localizedDescription());
     }
     std::size_t diagnostics = 0;
-    for (const DescribedDiagnostic& one : survey.catalogue) {
+    for (const DescribedDiagnostic& one : scan.catalogue) {
       if (one.description.error != nullptr) {
         throw CommandError(ExitCode::kCannotRead, one.diagnostic.name + " cannot be described: " +
                                                       one.description.error->localizedDescription());
       }
       if (!one.diagnostic.experimentOnly) ++diagnostics;
     }
-    return countText(diagnostics, "diagnostic") + ", " + countText(survey.catalogue.size() - diagnostics, "experiment");
+    return countText(diagnostics, "diagnostic") + ", " + countText(scan.catalogue.size() - diagnostics, "experiment");
   }
 
   void checkPhones() {

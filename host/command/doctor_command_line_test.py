@@ -1,4 +1,4 @@
-"""quazor doctor, on installations that are whole and on broken ones."""
+"""quazor doctor on intact and on broken installations."""
 
 import os
 import pathlib
@@ -18,7 +18,7 @@ class DoctorCase(CommandLineTest):
         self.state = self.directory / "state"
 
     def doctor(self, *arguments, state=None):
-        """The exit code, and what is told of each thing: (is it fine, its kind and name, the finding)."""
+        """The exit code, and for each line of output: (accepted or not, kind and name, finding)."""
         result = quazor("doctor", *arguments, env={"XDG_STATE_HOME": str(state or self.state)})
         self.assertEqual(result.stderr, "")
         lines = result.stdout.splitlines()
@@ -31,7 +31,7 @@ class DoctorCase(CommandLineTest):
         return result.returncode, found
 
     def assert_refused(self, outcome, what, why):
-        """That alone is refused, for this reason."""
+        """Checks that only this item is refused, for this reason."""
         code, found = outcome
         self.assertEqual(code, 66)
         refused = [(name, finding) for fine, name, finding in found if not fine]
@@ -77,7 +77,7 @@ class DoctorTest(DoctorCase):
 
 
 class BrokenInstallationTest(DoctorCase):
-    """An installation of its own, whose data can be broken."""
+    """An installation whose data a test can damage."""
 
     def setUp(self):
         super().setUp()

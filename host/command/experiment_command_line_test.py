@@ -1,4 +1,4 @@
-"""Experiments on their own, as users of the program meet them."""
+"""The `experiment` command, run as a program."""
 
 import csv
 import io
@@ -19,7 +19,7 @@ class ExperimentTest(CommandLineTest):
         return self.run_alone("--set", "duration=2", *arguments, names=["Alone.Counts"], **options)
 
     def rows(self, *arguments, code=0, **options):
-        """The CSV table's rows, the header first."""
+        """The rows of the CSV table, including the header."""
         result = self.run_alone("--format", "csv", *arguments, **options)
         self.assertEqual(result.returncode, code, result.stderr)
         return list(csv.reader(io.StringIO(result.stdout), strict=True))
@@ -139,7 +139,7 @@ class ExperimentTest(CommandLineTest):
                arguments=["experiment", "Alone.Images", "--profile", profile])
 
     def test_a_plugin_without_experiments(self):
-        # A plug-in's diagnostics have experiments, so only one that registers analyses alone has none.
+        # A diagnostic needs an experiment, so only a plug-in that registers nothing but analyses has none.
         self.assert_refused(quazor("experiment", "--all", "--plugin", PLUGINS / "analysis_plugin.so"), 64,
                             "the loaded plug-ins have no experiments")
         self.assert_refused(quazor("run", "--all", "--plugin", PLUGINS / "analysis_plugin.so", "--phone", self.phone),

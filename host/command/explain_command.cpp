@@ -53,7 +53,7 @@ bool canEndIn(const std::vector<std::string>& names, const Explanation& error) {
   });
 }
 
-// The errors that the diagnostic or experiment can end in.
+// Prints the errors that the diagnostic or experiment can end with.
 void printErrors(std::ostream& out, const Explanation& one, const std::vector<Explanation>& all) {
   std::string_view heading = "\n  Possible errors\n";
   for (const Explanation& error : all) {

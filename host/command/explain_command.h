@@ -1,4 +1,4 @@
-// `quazor explain`: what an error or a name means, likely causes, and what to do next.
+// `quazor explain`: the meaning of an error or a name, its likely causes and the next steps.
 #pragma once
 
 #include <filesystem>
@@ -8,11 +8,10 @@
 
 namespace quazor {
 
-// Writes the explanations of what `asked` names (see findExplanations), each once, in the order in which they are asked
-// for; all of them, as text only their titles, when nothing is asked for. `directory` is where the explanations are.
-// As text for people, in lines of at most 80 columns, or as one JSON document (docs/json_output.md). Throws a
-// CommandError before anything is written: kUsage for what has no explanation, kCannotRead for explanations that cannot
-// be read.
+// Prints the explanations that `asked` selects (see findExplanations), each once, in the order of `asked`. If `asked`
+// is empty, prints all; as text only their titles. `directory` contains the explanations. The output is text of at most
+// 80 columns or one JSON document (docs/json_output.md). Before any output, throws a CommandError: kUsage if something
+// has no explanation, kCannotRead if the explanations cannot be read.
 void explain(const std::vector<std::string>& asked, const std::filesystem::path& directory, bool json,
              std::ostream& out);
 

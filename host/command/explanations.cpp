@@ -56,7 +56,7 @@ std::vector<std::string> optionalLines(const JsonCursor& object, std::string_vie
   return entry ? linesOf(*entry) : std::vector<std::string>();
 }
 
-// What errors and names have in common.
+// The members that explanations of errors and of names share.
 Explanation explanationOf(const JsonCursor& object) {
   Explanation explanation;
   explanation.title = lineOf(object.at("title"));
@@ -161,7 +161,7 @@ bool holds(const std::vector<std::string>& texts, const std::string& text) {
   return std::ranges::find(texts, text) != texts.end();
 }
 
-// What tells domains apart: their names without the ending that all have.
+// A domain's name without the suffix that all domains share.
 std::string stemOf(const std::string& domain) {
   constexpr std::string_view kEnding = "ErrorDomain";
   return domain.ends_with(kEnding) ? domain.substr(0, domain.size() - kEnding.size()) : domain;
@@ -220,7 +220,7 @@ std::vector<Explanation> parseExplanations(const std::string& file, std::string_
 
 std::vector<Explanation> readExplanations(const std::filesystem::path& directory) {
   std::vector<Explanation> all;
-  std::map<std::string, std::string> seen;  // what is explained, and the file that does it
+  std::map<std::string, std::string> seen;  // from each explained error or name to its file
   for (const std::filesystem::path& file : filesIn(directory)) {
     for (Explanation& one : explanationsOf(JsonCursor(JsonDocument::read(file)))) {
       for (const std::string& key : keysOf(one)) {

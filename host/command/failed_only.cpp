@@ -21,7 +21,7 @@ OrderedMap<Value> valuesOf(const std::vector<ResolvedParameter>& parameters) {
 
 void refuseFailedPlugins(const RecordedRun& run) {
   for (const DiagnosticRecord& one : run.records) {
-    if (!one.experimentName.empty()) continue;  // it is no plug-in
+    if (!one.experimentName.empty()) continue;  // a record without an experiment is that of a plug-in
     throw CommandError(
         ExitCode::kCannotRead,
         "the plug-in " + one.name +
@@ -30,7 +30,7 @@ void refuseFailedPlugins(const RecordedRun& run) {
   }
 }
 
-// The parameters of a run's diagnostics of these names; what was not begun is not among them.
+// The recorded parameters of the diagnostics with these names. Diagnostics that never started have none.
 Profile recordedProfile(const std::filesystem::path& record, const RecordedRun& run,
                         const std::vector<std::string>& names) {
   Profile profile{record, {}};
@@ -62,7 +62,7 @@ Options optionsToRunAgain(Options options) {
                                                run.began.phone + "'; choose another phone with --phone");
     }
   }
-  // What the installed profile set then is in the record; it may have changed since, or have been left out.
+  // The record contains the values of the installed profile, which may have changed since or not have been used.
   const bool allRecorded = options.recorded->entries.size() == options.names.size();
   if (options.profile.empty() && allRecorded) options.withoutProfile = true;
   return options;

@@ -1,15 +1,15 @@
-// What is run again: that which did not pass, as it was run.
+// `run --only failed`: repeats the diagnostics that did not pass.
 #pragma once
 
 #include "host/cli/command_line.h"
 
 namespace quazor {
 
-// The options of `run --only failed` with what that means: the names of what did not pass in the record of --of or in
-// that of the last run; its parameters, below all that are given now; and its phone and its plug-ins where none are
-// given. No names: everything passed. Throws a CommandError (kCannotRead) where there is no such record, and for one
-// with a plug-in that could not be loaded; one (kUsage) for a seed or real time where that run's phone was no simulated
-// one.
+// Completes the options of `run --only failed` from the record given by --of, or from that of the previous run: the
+// names of the diagnostics that did not pass; the recorded parameters, with lower priority than all that are given now;
+// and the phone and plug-ins unless they are given. The names are empty if everything passed. Throws a CommandError:
+// kCannotRead if there is no such record or if a plug-in could not be loaded in that run; kUsage for a seed or real
+// time if that run's phone was not simulated.
 Options optionsToRunAgain(Options options);
 
 }  // namespace quazor

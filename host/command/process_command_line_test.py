@@ -1,5 +1,4 @@
-"""Plug-ins in processes of their own, parameters from all their places, and interrupts, as users of the program meet
-them."""
+"""Plug-ins in separate processes, the sources of parameters, and interrupts."""
 
 import json
 import os
@@ -20,7 +19,7 @@ class ParametersTest(CommandLineTest):
         return self.write(name, json.dumps({"schema": 1, "diagnostics": {"Fake.*": {"experiment": values}}}))
 
     def described(self, *arguments, **options):
-        """Value and source of the experiment's parameters."""
+        """The value and source of each parameter of the experiment."""
         result = quazor("describe", "Fake.One", "--plugin", WORKING, "--format", "json", *arguments, **options)
         self.assertEqual(result.returncode, 0, result.stderr)
         parameters = json.loads(result.stdout)["diagnostics"][0]["experiment"]["parameters"]
@@ -169,7 +168,7 @@ class ProcessTest(CommandLineTest):
         self.assertEqual(unruly["verdict"], "pass")
 
     def test_it_runs_where_the_ends_of_children_are_ignored(self):
-        # A program that waits for ends of which nobody tells it takes five seconds every time; a busy machine does not.
+        # A watcher that polls for ends it is not notified of always takes five seconds; a busy machine only sometimes.
         for _ in range(10):
             begin = time.monotonic()
             result = self.run_fake(preexec_fn=lambda: signal.signal(signal.SIGCHLD, signal.SIG_IGN))
@@ -191,11 +190,11 @@ class InterruptTest(CommandLineTest):
         self.record = self.directory / "run.jsonl"
 
     def interrupted(self, *arguments, signals=(signal.SIGINT,)):
-        """Runs one diagnostic that ends at once and two that take too long, and interrupts the second."""
+        """Runs one diagnostic that ends at once and two that never end in time, and interrupts the second."""
         process = start("run", *self.NAMES, "--plugin", WORKING, "--phone", self.phone, "--profile", "none",
                         "--realtime", "--set", "duration=60", "--record", self.record, *arguments)
         self.addCleanup(process.kill)
-        line = process.stderr.readline()  # the run's first log line: it is in the second diagnostic
+        line = process.stderr.readline()  # the first log line: the second diagnostic is running
         self.assertIn("an error line", line)
         begin = time.monotonic()
         for one in signals:

@@ -1,4 +1,4 @@
-"""Records as users of the program meet them: made, verified, analyzed again, compared, and run from."""
+"""Records: written, verified, analyzed again, compared, and used for another run."""
 
 import json
 import pathlib
@@ -15,14 +15,14 @@ class RecordTest(CommandLineTest):
         self.record = self.directory / "run.jsonl"
 
     def recorded(self, *arguments, code=0, record=None, **options):
-        """A record of a run of the fake diagnostic."""
+        """Returns a record of a run of the fake diagnostic."""
         record = record or self.record
         result = self.run_fake("--record", record, *arguments, **options)
         self.assertEqual(result.returncode, code, result.stderr)
         return record
 
     def changed(self, change):
-        """A copy of the record with changed events."""
+        """Writes a copy of the record with changed events."""
         events = events_in(self.record)
         change(events)
         return self.write("changed.jsonl", "".join(json.dumps(event) + "\n" for event in events))
@@ -246,7 +246,7 @@ class AnalyzeTest(RecordTest):
 
 
 class EarlierRecordTest(RecordTest):
-    """Records whose stage analyze is still written `analyse`."""
+    """Records that spell the stage analyze as `analyse`."""
 
     def setUp(self):
         super().setUp()
@@ -323,7 +323,7 @@ class OnlyFailedTest(RecordTest):
         self.state = {"XDG_STATE_HOME": str(self.directory / "state")}
 
     def run_names(self, *names, code):
-        # Nothing takes a parameter where nothing can be described.
+        # A parameter is refused if no diagnostic can be described.
         result = self.run_fake(names=names, env=self.state, duration=1 if "Fake.One" in names else None)
         self.assertEqual(result.returncode, code, result.stderr)
 
@@ -379,7 +379,7 @@ class OnlyFailedTest(RecordTest):
         last = pathlib.Path(self.state["XDG_STATE_HOME"]) / "quazor/last_run.jsonl"
         last.write_text("".join(last.read_text().splitlines(keepends=True)[:1]))
         result = quazor("run", "--only", "failed", env=self.state)
-        self.assert_refused(result, 64, "duration")  # which no profile sets
+        self.assert_refused(result, 64, "duration")  # a parameter that no profile sets
 
     def test_it_takes_a_record(self):
         self.recorded(code=2, names=["Fake.One", "Broken.Nothing"])

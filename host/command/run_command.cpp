@@ -22,14 +22,14 @@ namespace quazor {
 
 namespace {
 
-// What is to be done for each diagnostic.
+// A diagnostic to run or analyze.
 struct Job {
   ResolvedDiagnostic bound;
-  const QZExperimentResult* result = nullptr;  // to be analyzed; null: the experiment is run
+  const QZExperimentResult* result = nullptr;  // the result to analyze; null: run the experiment
   std::uint64_t seed = 0;
 };
 
-// Does the jobs, one after the other, each in a process of its own or all in this one.
+// Performs the jobs in order, each in a separate process or all in this one.
 class Conductor {
  public:
   Conductor(IsolationOptions isolation, const Options& options, RunOptions runOptions, EventPipeline& events)
@@ -40,7 +40,7 @@ class Conductor {
     if (!inProcess_) signals_.emplace();
   }
 
-  // What the user interrupted, as RunEnded has it; nothing when the run goes on.
+  // Returns the diagnostic that the user interrupted, as in RunEnded; nothing if the run continues.
   std::optional<std::string> perform(const Job& job) {
     const auto& [diagnostic, description] = job.bound.described;
     events_.onEvent(DiagnosticStarted{diagnostic.name, job.bound.described.summary(), diagnostic.experimentName,
@@ -55,7 +55,7 @@ class Conductor {
                             events_.progress(), events_)) {
       interrupted = diagnostic.name;
     } else if (signals_->requestsToEnd() > 0) {
-      interrupted = "";  // it was asked to end when there was nothing more to end
+      interrupted = "";  // the interrupt came after the end of the diagnostic
     }
     events_.endDiagnostic();
     return interrupted;
@@ -78,7 +78,7 @@ class Conductor {
   std::optional<WatchedSignals> signals_;
 };
 
-// A plug-in that could not be loaded stands in the report like a diagnostic.
+// Reports a plug-in that could not be loaded like a diagnostic.
 void tellFailedPlugin(const FailedPlugin& plugin, EventPipeline& events) {
   events.onEvent(DiagnosticStarted{
       plugin.file.filename().string(), "A plug-in that could not be loaded.", {}, {}, false, {}, 0, dateNow()});
@@ -96,7 +96,7 @@ RunStarted beginningOf(const Options& options, const Installation& installation,
   return began;
 }
 
-// Before anything runs: an output that cannot be written would make the whole run worthless.
+// Checks the output files before anything runs: a run whose output cannot be written is worthless.
 void checkOutputs(const Options& options) {
   std::vector<std::filesystem::path> regular;
   const auto check = [&regular](const std::filesystem::path& file) {
@@ -143,7 +143,7 @@ ExitCode perform(const Options& options, const Installation& installation, Conso
   return events.exitCode();
 }
 
-// There is nothing to run again, and what was asked for to be written says so.
+// Handles the case that nothing failed: still writes the requested files.
 ExitCode performNothing(const Options& options, const Installation& installation, Console& console) {
   checkOutputs(options);
   const bool isForPeople = options.report.format == Format::kText || !options.report.output.empty();
@@ -156,7 +156,7 @@ ExitCode performNothing(const Options& options, const Installation& installation
   return events.exitCode();
 }
 
-// The phone that the options mean, by its name in records.
+// Returns the name of the selected phone, as records have it.
 std::string choosePhone(const Options& options, const Installation& installation, PhoneMaker* makePhone) {
   if (const auto binding = bindingNamed(options.phone)) {
     const std::filesystem::path file = installation.binding(*binding);
@@ -190,7 +190,7 @@ ExitCode runCommand(const Options& given, const Installation& installation, Cons
 
 namespace {
 
-// The parameters of a recorded run, with those of its analysis replaced that are set now.
+// The parameters of a recorded run, in which the settings of the command line replace those of the analysis.
 ResolvedParameters reboundParameters(const DiagnosticRecord& record, const ResolvedDiagnostic& now) {
   ResolvedParameters parameters{record.parameters.experiment, now.parameters.analysis};
   for (ResolvedParameter& one : parameters.analysis) {
@@ -209,12 +209,12 @@ ResolvedParameters reboundParameters(const DiagnosticRecord& record, const Resol
 ExitCode analyzeCommand(const Options& given, const Installation& installation, Console& console) {
   const RecordedRun run = runIn(given.records.front());
   Options options = given;
-  if (options.profile.empty()) options.withoutProfile = true;  // the record has what the profile set then
+  if (options.profile.empty()) options.withoutProfile = true;  // the record contains the profile's values
   for (ParameterOverride& setting : options.settings) {
-    if (setting.half == Part::kExperiment) {
+    if (setting.part == Part::kExperiment) {
       throw CommandError(ExitCode::kUsage, "--set '" + setting.text + "': 'quazor analyze' does not run experiments");
     }
-    setting.half = Part::kAnalysis;
+    setting.part = Part::kAnalysis;
   }
   std::vector<const DiagnosticRecord*> analysable;
   for (const DiagnosticRecord& record : run.records) {

@@ -40,7 +40,7 @@ std::vector<Profile> profilesOf(const Options& options, const Installation& inst
   std::vector<Profile> profiles;
   if (!options.withoutProfile && options.profile.empty()) {
     profiles.push_back(readProfile(installation.defaultProfile()));
-    profiles.back().mayNameOthers = true;  // it is for whatever plug-ins may be loaded
+    profiles.back().mayNameOthers = true;  // the installed profile serves any set of plug-ins
   }
   if (options.recorded) profiles.push_back(*options.recorded);
   if (!options.withoutProfile && !options.profile.empty()) profiles.push_back(readProfile(options.profile));
@@ -48,25 +48,25 @@ std::vector<Profile> profilesOf(const Options& options, const Installation& inst
   return profiles;
 }
 
-// Asks for the descriptions without which the profiles cannot be checked.
-void describeDoubts(const Options& options, const Installation& installation, const std::vector<Profile>& profiles,
-                    std::vector<DescribedDiagnostic>& catalogue) {
-  std::vector<Diagnostic> doubts;
+// Requests the descriptions that are needed to check the profiles.
+void describeForProfiles(const Options& options, const Installation& installation, const std::vector<Profile>& profiles,
+                         std::vector<DescribedDiagnostic>& catalogue) {
+  std::vector<Diagnostic> undescribed;
   for (const Profile& profile : profiles) {
     const std::vector<Diagnostic> more = diagnosticsToDescribe(profile, catalogue);
-    doubts.insert(doubts.end(), more.begin(), more.end());
+    undescribed.insert(undescribed.end(), more.begin(), more.end());
   }
-  if (doubts.empty()) return;
-  if (options.inProcess) {  // where they are loaded already
+  if (undescribed.empty()) return;
+  if (options.inProcess) {  // the plug-ins are already loaded
     for (DescribedDiagnostic& one : catalogue) {
-      if (contains(doubts, one.diagnostic)) one.description = describeDiagnostic(one.diagnostic);
+      if (contains(undescribed, one.diagnostic)) one.description = describeDiagnostic(one.diagnostic);
     }
     return;
   }
-  const PluginScan survey =
-      surveyOf(options, installation, [&doubts](const std::vector<Diagnostic>& /*catalogue*/) { return doubts; });
+  const PluginScan scan = scanOf(options, installation,
+                                 [&undescribed](const std::vector<Diagnostic>& /*catalogue*/) { return undescribed; });
   for (DescribedDiagnostic& one : catalogue) {
-    for (const DescribedDiagnostic& asked : survey.catalogue) {
+    for (const DescribedDiagnostic& asked : scan.catalogue) {
       if (asked.description.isAsked && contains({asked.diagnostic}, one.diagnostic))
         one.description = asked.description;
     }
@@ -81,37 +81,37 @@ IsolationOptions isolationOf(const Options& options, const Installation& install
   return isolation;
 }
 
-PluginScan surveyOf(const Options& options, const Installation& installation, const DiagnosticChoice& described) {
+PluginScan scanOf(const Options& options, const Installation& installation, const DiagnosticChoice& described) {
   const IsolationOptions isolation = isolationOf(options, installation);
-  PluginScan survey;
+  PluginScan scan;
   if (options.inProcess) {
     loadPlugins(isolation.plugins);
     const std::vector<Diagnostic> catalogue = catalogueOf(QZLab::defaultLab());
     const std::vector<Diagnostic> wanted = described(catalogue);
-    for (const Diagnostic& one : catalogue) survey.catalogue.push_back({one, describeIfWanted(one, wanted)});
-    return survey;
+    for (const Diagnostic& one : catalogue) scan.catalogue.push_back({one, describeIfWanted(one, wanted)});
+    return scan;
   }
   WatchedSignals signals;
-  survey = scanPlugins(isolation, signals, described);
-  if (survey.interrupted) throw CommandError(ExitCode::kInterrupted, "interrupted while loading the plug-ins");
-  return survey;
+  scan = scanPlugins(isolation, signals, described);
+  if (scan.interrupted) throw CommandError(ExitCode::kInterrupted, "interrupted while loading the plug-ins");
+  return scan;
 }
 
-PluginScan surveyForSelection(const Options& options, const Installation& installation) {
-  return surveyOf(options, installation,
-                  [&options](const std::vector<Diagnostic>& catalogue) { return wantedOf(catalogue, options, true); });
+PluginScan scanForSelection(const Options& options, const Installation& installation) {
+  return scanOf(options, installation,
+                [&options](const std::vector<Diagnostic>& catalogue) { return wantedOf(catalogue, options, true); });
 }
 
 Selection select(const Options& options, const Installation& installation) {
-  PluginScan survey = surveyForSelection(options, installation);
-  std::vector<DescribedDiagnostic>& described = survey.catalogue;
+  PluginScan scan = scanForSelection(options, installation);
+  std::vector<DescribedDiagnostic>& described = scan.catalogue;
   std::vector<Diagnostic> catalogue;
   catalogue.reserve(described.size());
   for (const DescribedDiagnostic& one : described) catalogue.push_back(one.diagnostic);
 
-  const std::vector<Diagnostic> wanted = wantedOf(catalogue, options, !survey.failed.empty());
+  const std::vector<Diagnostic> wanted = wantedOf(catalogue, options, !scan.failed.empty());
   const std::vector<Profile> profiles = profilesOf(options, installation);
-  describeDoubts(options, installation, profiles, described);
+  describeForProfiles(options, installation, profiles, described);
   for (const Profile& profile : profiles) checkProfile(profile, described);
   std::vector<ParameterOverride> settings = overridesOfEnvironment();
   settings.insert(settings.end(), options.settings.begin(), options.settings.end());
@@ -123,7 +123,7 @@ Selection select(const Options& options, const Installation& installation) {
     }
   }
   if (!selected.empty()) checkOverrides(settings, selected);
-  Selection selection{{}, std::move(survey.failed)};
+  Selection selection{{}, std::move(scan.failed)};
   for (DescribedDiagnostic& one : selected) {
     ResolvedParameters parameters = resolveParameters(one, profiles, settings);
     selection.diagnostics.push_back({std::move(one), std::move(parameters)});

@@ -50,7 +50,7 @@ class SelectionTest : public testing::Test {
     } catch (const CommandError& refusal) {
       EXPECT_EQ(refusal.code(), code) << refusal.what();
       return refusal.what();
-    } catch (const InputError& problem) {  // of a file that was read
+    } catch (const InputError& problem) {  // from reading a file
       EXPECT_EQ(ExitCode::kCannotRead, code) << problem.what();
       return problem.what();
     }
@@ -129,7 +129,7 @@ TEST_F(SelectionTest, TakesParametersFromTheLastPlaceThatHasThem) {
 
 TEST_F(SelectionTest, RefusesWhatIsWrongWithParameters) {
   options_.names = {"Fake.One"};
-  // Only the installed profile may speak of what is not loaded.
+  // Only the installed profile may name diagnostics that are not loaded.
   const auto other = directory_.write("other.json", profileText(R"({"Other": {}})"));
   options_.profile = other;
   EXPECT_THAT(refusal(ExitCode::kCannotRead), HasSubstr("has an entry 'Other', which matches no diagnostic"));
@@ -158,14 +158,14 @@ TEST_F(SelectionTest, AsksOnlyWhatIsSelectedForItsDescription) {
       {"a description", Command::kDescribe, {"Unruly"}},
       {"a description by a pattern", Command::kDescribe, {"Unr*"}},
   };
-  // Whoever asks the other one ends the process, which becomes an error.
+  // Describing the other diagnostic ends the process, which becomes an error.
   options_.plugins = {plugin("undescribable"), plugin("unruly")};
   for (const Row& row : rows) {
     options_.command = row.command;
     options_.names = row.names;
     std::vector<std::string> asked;
     const Installation installation(directory_.path() / "bin" / "quazor");
-    const std::vector<DescribedDiagnostic> all = surveyForSelection(options_, installation).catalogue;
+    const std::vector<DescribedDiagnostic> all = scanForSelection(options_, installation).catalogue;
     for (const DescribedDiagnostic& one : all) {
       if (one.description.isAsked) asked.push_back(one.diagnostic.name);
     }
@@ -192,7 +192,7 @@ TEST_F(SelectionTest, AsksWhatElseAnEntryFitsBeforeItRefusesAParameter) {
   const std::string wide = profileText(R"({"[FU]*[!x]": {"experiment": {"way": 1}}})");
   withEntry(wide.c_str());
   EXPECT_THAT(selected(), ElementsAre("Fake.One"));
-  // In a copy of this process: what is loaded stays.
+  // In a child process, because plug-ins stay loaded.
   const pid_t child = ::fork();
   if (child == 0) {
     options_.inProcess = true;
@@ -213,7 +213,7 @@ TEST_F(SelectionTest, GoesOnWithoutAPluginThatCannotBeLoaded) {
   EXPECT_EQ(selection.failed[0].file, plugin("fatal"));
   options_.plugins = {plugin("fatal")};
   EXPECT_THAT(selected(), IsEmpty());
-  options_.settings = {parseOverride("duration=1")};  // perhaps it is that plug-in's
+  options_.settings = {parseOverride("duration=1")};  // may belong to that plug-in
   EXPECT_THAT(selected(), IsEmpty());
   options_.names.clear();
   options_.all = true;
@@ -237,7 +237,7 @@ TEST_F(SelectionTest, LoadsPluginsIntoThisProcessOnlyWhenAskedTo) {
   const std::size_t before = QZLab::defaultLab().registrations().size();
   EXPECT_EQ(selected().size(), 2U);
   EXPECT_EQ(QZLab::defaultLab().registrations().size(), before);
-  // In a copy of this process: what is loaded stays.
+  // In a child process, because plug-ins stay loaded.
   const pid_t child = ::fork();
   if (child == 0) {
     options_.inProcess = true;

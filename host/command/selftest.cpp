@@ -46,14 +46,14 @@ std::size_t imagesIn(const DiagnosticRecord& record) {
   return images == nullptr || images->array() == nullptr ? 0 : images->array()->size();
 }
 
-// What of the outcome is compared, as expected and as it is.
+// A part of the outcome: expected and actual.
 struct Comparison {
   std::string_view what;
   std::string expected;
   std::string outcome;
 };
 
-// What a table counts for one diagnostic.
+// The counts of one diagnostic in the summary table.
 struct Counts {
   std::size_t faulty = 0;
   std::size_t detected = 0;
@@ -98,7 +98,7 @@ std::string_view nameOf(SelftestVerdict verdict) {
 }
 
 std::string differenceOf(const ExpectedOutcome& expected, const DiagnosticRecord& record) {
-  // The host's own words for a run that gave no error say nothing of the phone.
+  // The host's own error for a run that reported none says nothing about the phone.
   const bool hostsWord = isOfHost(record.error) && !expected.error;
   const DiagnosticErrorPtr error = hostsWord ? nullptr : record.error;
   std::vector<Comparison> comparisons = {

@@ -1,4 +1,4 @@
-// The self-test: do the diagnostics find what is wrong with a phone, and nothing that is not?
+// The self-test: checks that the diagnostics find the faults of a phone and raise no false alarms.
 #pragma once
 
 #include "host/device/phone.h"
@@ -13,38 +13,38 @@
 
 namespace quazor {
 
-// What the runs of one diagnostic or experiment on one phone came to.
+// The outcome of the runs of one diagnostic or experiment on one phone.
 struct SelftestRow {
   std::string scenario;
   ExpectedOutcome expected;
   std::uint64_t runs = 0;
   std::uint64_t asExpected = 0;
   std::uint64_t passes = 0;                // runs with the verdict pass
-  std::string difference;                  // what the first run that was not as expected had instead
-  std::vector<std::uint64_t> faultsFired;  // for each fault of the phone, in all runs together
+  std::string difference;                  // of the first run that did not end as expected
+  std::vector<std::uint64_t> faultsFired;  // per fault of the phone, in all runs together
 };
 
 enum class SelftestVerdict {
-  kPassed,      // a phone without a fault for it passed, as it should
-  kDetected,    // what is wrong was found, as it should be
-  kMissed,      // something is wrong with the phone, and a run passed
-  kFalseAlarm,  // nothing is wrong for it, and a run did not pass
-  kDifferent,   // found, but not as expected
-  kInvalid,     // a fault of the phone never fired: the runs show nothing
+  kPassed,      // the phone has no fault for this diagnostic, and every run passed
+  kDetected,    // the fault was found
+  kMissed,      // the phone has a fault, and a run passed
+  kFalseAlarm,  // the phone has no fault, and a run did not pass
+  kDifferent,   // found, but not with the expected outcome
+  kInvalid,     // a fault of the phone never fired, so the runs show nothing
 };
 
 std::string_view nameOf(SelftestVerdict verdict);
 
-// How the outcome differs from what was expected, for people; the empty text when it does not.
+// A user-readable difference between the outcome and the expected one; empty if there is none.
 std::string differenceOf(const ExpectedOutcome& expected, const DiagnosticRecord& record);
 
-// A phone's faults count for all of its rows together.
+// The faults of a phone are counted over all of its rows.
 std::vector<SelftestVerdict> verdictsOf(const std::vector<SelftestRow>& rows);
 
-// True when every row is kPassed or kDetected.
+// True if every row is kPassed or kDetected.
 bool allPassed(const std::vector<SelftestVerdict>& verdicts);
 
-// A line for every row, then, for each diagnostic, how many faults were detected and how many alarms were false.
+// Prints a line per row, then per diagnostic the number of detected faults and of false alarms.
 void printSelftest(std::ostream& out, const std::vector<SelftestRow>& rows, std::uint64_t seeds);
 nlohmann::ordered_json selftestDocument(const std::vector<SelftestRow>& rows, std::uint64_t seeds);
 

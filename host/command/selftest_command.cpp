@@ -37,8 +37,8 @@ class Selftest {
   Selftest(const Options& options, const Installation& installation, Console& console)
       : options_(withAllPlugins(options, installation)),
         installation_(installation),
-        survey_(surveyOf(options_, installation, [](const std::vector<Diagnostic>& all) { return all; })),
-        isolation_(withoutFailed(isolationOf(options_, installation), survey_.failed)),
+        scan_(scanOf(options_, installation, [](const std::vector<Diagnostic>& all) { return all; })),
+        isolation_(withoutFailed(isolationOf(options_, installation), scan_.failed)),
         progress_(console.showsProgress ? &console.err : nullptr) {
     profile_ = readProfile(installation.defaultProfile());
     if (!options_.inProcess) signals_.emplace();
@@ -80,7 +80,7 @@ class Selftest {
   }
 
   const DescribedDiagnostic& find(const ExpectedOutcome& expected) const {
-    for (const DescribedDiagnostic& one : survey_.catalogue) {
+    for (const DescribedDiagnostic& one : scan_.catalogue) {
       const Diagnostic& diagnostic = one.diagnostic;
       if (diagnostic.name == expected.name && diagnostic.experimentOnly == expected.experimentOnly) return one;
     }
@@ -92,7 +92,7 @@ class Selftest {
     if (!expected.experimentOnly) return resolveParameters(described, {profile_}, {});
     std::vector<ParameterOverride> settings;
     for (const auto& [name, value] : expected.parameters) {
-      // As it would stand on a command line: a whole number is an integer.
+      // Formats the value like on a command line, where a whole number is an integer.
       settings.push_back(parseOverride(formatMessage("%@=%@", name, value)));
     }
     return resolveParameters(described, {}, settings);
@@ -121,7 +121,7 @@ class Selftest {
 
   const Options options_;
   const Installation& installation_;
-  const PluginScan survey_;
+  const PluginScan scan_;
   const IsolationOptions isolation_;
   Progress progress_;
   Profile profile_;

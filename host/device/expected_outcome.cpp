@@ -13,7 +13,7 @@ namespace {
 
 constexpr std::uint64_t kMaxImages = 1'000'000'000;
 
-// Nothing for an entry that is missing or null.
+// Returns nothing if the entry is missing or null.
 std::optional<ExpectedError> readExpectedError(const JsonCursor& outcome, std::string_view key) {
   const std::optional<JsonCursor> error = outcome.find(key);
   if (!error || error->isNull()) return std::nullopt;

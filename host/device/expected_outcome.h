@@ -1,4 +1,4 @@
-// ExpectedOutcome: what a run on the phone of a scenario file should end in, as the file's key "expect" says.
+// ExpectedOutcome: the outcome that a run on the phone of a scenario should have, from the scenario's key "expect".
 #pragma once
 
 #include "contract/ordered_map.h"
@@ -12,7 +12,7 @@ namespace quazor {
 
 class JsonCursor;
 
-// The parts of an error that an outcome is expected to have.
+// The members of an error that are compared.
 struct ExpectedError {
   std::string domain;
   std::int64_t code = 0;
@@ -20,18 +20,18 @@ struct ExpectedError {
 };
 
 struct ExpectedOutcome {
-  std::string name;             // of the diagnostic, or of the experiment that is run alone
-  bool experimentOnly = false;  // then `parameters` are all that it is set up with
+  std::string name;             // of the diagnostic, or of the experiment on its own
+  bool experimentOnly = false;  // if so, `parameters` is the complete list of its parameters
   OrderedMap<double> parameters;
   std::string verdict;                      // "pass", "fail" or "error"
-  std::optional<ExpectedError> error;       // nothing: none, but for the host's own words
-  std::optional<ExpectedError> underlying;  // nothing: not looked at
+  std::optional<ExpectedError> error;       // nothing: no error, apart from the host's own
+  std::optional<ExpectedError> underlying;  // nothing: not compared
   std::vector<std::string> failedResults;
-  std::optional<std::uint64_t> images;  // how many the auxiliary data holds; nothing: not looked at
+  std::optional<std::uint64_t> images;  // the number of images in the auxiliary data; nothing: not compared
 };
 
-// The outcomes in a scenario's document, in their order; none where it has no key "expect". Throws InputError, as
-// JsonCursor does, for an outcome that is malformed or contradicts itself. Any thread.
+// The expected outcomes of a scenario, in order; empty without the key "expect". Throws InputError, like JsonCursor, if
+// an outcome is malformed or contradictory. Thread: any.
 std::vector<ExpectedOutcome> readExpectedOutcomes(const JsonCursor& scenario);
 
 }  // namespace quazor

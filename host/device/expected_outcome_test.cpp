@@ -14,7 +14,7 @@ std::vector<ExpectedOutcome> outcomesIn(const std::string& expect) {
   return readExpectedOutcomes(JsonCursor(document));
 }
 
-// The one outcome with these entries.
+// The only outcome, with these entries.
 ExpectedOutcome outcomeWith(const std::string& entries) { return outcomesIn(R"({"E": {)" + entries + "}}")[0]; }
 
 std::string problemOf(const std::string& json) {

@@ -4,9 +4,9 @@
 #include "backends/linux/probe/probe.h"
 #include "backends/linux/system/journal_log.h"
 #include "backends/linux/video/projector_guard.h"
+#include "backends/log/system_log.h"
 #include "backends/simulated/scenario/scenario.h"
 #include "backends/simulated/simulated_phone.h"
-#include "backends/log/system_log.h"
 #include "base/json/json_cursor.h"
 #include "base/text/input_error.h"
 
@@ -51,7 +51,7 @@ class PhoneOfBinding final : public Phone {
   LinuxPhone phone_;
 };
 
-// What `readIt` reads from the file.
+// Reads the file with `readIt` and adds to an InputError what cannot be created.
 template <class Read>
 auto read(Read&& readIt, const std::filesystem::path& file) {
   try {
@@ -61,7 +61,7 @@ auto read(Read&& readIt, const std::filesystem::path& file) {
   }
 }
 
-// A scenario file: the phone that it describes, and what runs on it should end in.
+// The contents of a scenario file: the phone and the expected outcomes.
 struct ScenarioFile {
   Scenario scenario;
   std::vector<ExpectedOutcome> expected;

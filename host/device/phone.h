@@ -1,4 +1,4 @@
-// Phones to run diagnostics on. phone.cpp is the only place that names the backend that stands behind them.
+// The phones that diagnostics run on. Only phone.cpp names the backends.
 #pragma once
 
 #include "contract/log_channel.h"
@@ -18,14 +18,14 @@
 
 namespace quazor {
 
-// A fault that the phone was told to have, as its scenario or binding has it, and how many calls it changed.
+// A fault that the scenario or binding declares, and the number of calls that it changed.
 struct DeclaredFault {
   nlohmann::ordered_json fault;
   std::uint64_t fired = 0;
 };
 
-// One phone, for one run. Its platform's services may outlive it.
-// Thread: one at a time, but for framesDelivered(): any.
+// One phone, for one run. The services of its platform may outlive it.
+// Thread: one at a time, except framesDelivered(): any.
 class Phone {
  public:
   Phone() = default;
@@ -35,16 +35,16 @@ class Phone {
 
   virtual Platform platform() const = 0;
   virtual std::vector<DeclaredFault> faults() const = 0;
-  // How many frames its cameras have handed to handlers. Any thread.
+  // The number of frames that its cameras have delivered to handlers. Thread: any.
   virtual std::uint64_t framesDelivered() const = 0;
 };
 
 // Creates a new phone on every call, all in the same initial state.
 using PhoneMaker = std::function<std::unique_ptr<Phone>()>;
 
-// Reads a scenario file and gives the maker of the phones it describes: in virtual time, or in real time when
-// `realTime`. One seed is one course of events in virtual time. Makes no phone itself. Throws a CommandError
-// (kCannotRead) with the reader's sentence when the file cannot be read.
+// Reads a scenario file and returns a factory for its phones, in virtual time or, if `realTime`, in real time. In
+// virtual time the seed determines the course of events. Throws a CommandError (kCannotRead) with the reader's sentence
+// if the file cannot be read.
 PhoneMaker phonesOfScenario(const std::filesystem::path& file, bool realTime, std::uint64_t seed);
 
 struct ScenarioSummary {
@@ -53,19 +53,19 @@ struct ScenarioSummary {
   bool hasFaults = false;
 };
 
-// A phone's name that begins so is the machine that quazor runs on; what follows names the binding file.
+// Prefix of a phone's name that selects the machine quazor runs on; the name of the binding file follows.
 inline constexpr std::string_view kLinuxPrefix = "linux:";
 
-// The FILE of "linux:FILE"; nothing for other names of phones, which are scenarios'.
+// The FILE of "linux:FILE"; nothing for a name without that prefix, which is a scenario's.
 std::optional<std::filesystem::path> bindingNamed(const std::filesystem::path& phone);
 
 // Reads a binding file and returns a factory for this machine as a phone, in real time.
 // Throws a CommandError (kCannotRead) with the reader's sentence when the file cannot be read.
 PhoneMaker phonesOfBinding(const std::filesystem::path& file);
 
-// The devices of this machine that a binding can use: a user-readable list, and the text of a starter binding.
+// The devices of this machine that a binding can use, as a user-readable list, and the text of a starter binding.
 struct PhoneProbe {
-  std::vector<std::string> lines;  // may hold any character that a device gives
+  std::vector<std::string> lines;  // may contain any character that a device reports
   std::string binding;
 };
 PhoneProbe probeThisMachine();

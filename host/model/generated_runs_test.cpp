@@ -1,4 +1,4 @@
-// Runs of plug-ins that were generated: whatever they do, the verdict is the one that an oracle finds.
+// Generated plug-ins with arbitrary behaviour: the verdict of every run equals that of an oracle.
 #include "host/model/record_builder.h"
 #include "host/run/diagnostic_run.h"
 #include "host/testing/test_events.h"
@@ -15,7 +15,7 @@
 namespace quazor {
 namespace {
 
-// How an operation of a plug-in goes.
+// The outcome of an operation of a plug-in.
 enum class Way { kWorks, kWorksWithAnError, kFails, kFailsWithoutError, kThrows, kThrowsAnInteger };
 
 bool works(Way way) { return way == Way::kWorks || way == Way::kWorksWithAnError; }
@@ -27,7 +27,7 @@ bool perform(Way way, DiagnosticErrorPtr* error) {
   return works(way);
 }
 
-// All that a diagnostic does.
+// The behaviour of one diagnostic.
 struct Script {
   Way makeExperiment{}, describeExperiment{}, setup{}, run{}, teardown{};
   bool hasTeardown = false;
@@ -38,7 +38,7 @@ struct Script {
 };
 
 bool failsToBeMade(Way make, Way describe) {
-  // A description is returned, so it cannot fail but by an exception.
+  // A description is a return value, so only an exception makes it fail.
   return !works(make) || describe == Way::kThrows || describe == Way::kThrowsAnInteger;
 }
 
@@ -190,7 +190,7 @@ TEST(GeneratedRuns, HaveTheVerdictOfTheOracle) {
     runDiagnostic(diagnosticOf(script), {}, options, events);
     RecordBuilder builder;
     for (const RunEvent& event : events.events) {
-      // As long as the plug-in's part is not over there is no verdict but an error.
+      // Until the plug-in's part is completed the only possible verdict is an error.
       ASSERT_EQ(std::get<DiagnosticEnded>(builder.ending({}).back()).verdict, Verdict::kError) << i;
       builder.onEvent(event);
     }

@@ -10,8 +10,8 @@ namespace quazor {
 
 namespace {
 
-// Why the bound cannot be compared with the measurement; empty when it can.
-std::string problemOfBound(std::string_view which, const QZBound& bound, const Measurement& measured) {
+// Why the bound cannot be compared with the measurement; empty if it can.
+std::string validateBound(std::string_view which, const QZBound& bound, const Measurement& measured) {
   const Measurement& value = bound.value();
   if (!std::isfinite(value.value())) return formatMessage("its %@ bound is %@", which, value.value());
   if (&value.unit() != &measured.unit()) {
@@ -21,14 +21,14 @@ std::string problemOfBound(std::string_view which, const QZBound& bound, const M
   return {};
 }
 
-std::string problemOfLimit(const QZLimit& limit, const Measurement& measured) {
+std::string validateLimit(const QZLimit& limit, const Measurement& measured) {
   const QZBound* lower = limit.lowerBound().get();
   const QZBound* upper = limit.upperBound().get();
   if (lower != nullptr) {
-    if (std::string problem = problemOfBound("lower", *lower, measured); !problem.empty()) return problem;
+    if (std::string problem = validateBound("lower", *lower, measured); !problem.empty()) return problem;
   }
   if (upper != nullptr) {
-    if (std::string problem = problemOfBound("upper", *upper, measured); !problem.empty()) return problem;
+    if (std::string problem = validateBound("upper", *upper, measured); !problem.empty()) return problem;
   }
   if (lower != nullptr && upper != nullptr) {
     const double low = lower->value().value();
@@ -74,7 +74,7 @@ std::string_view nameOf(Verdict verdict) {
 JudgedResult judgeResult(QZMeasuredResult result) {
   const std::optional<QZLimit>& limit = result.limit();
   if (!limit || (limit->lowerBound() == nullptr && limit->upperBound() == nullptr)) return {std::move(result)};
-  if (const std::string problem = problemOfLimit(*limit, result.measurement()); !problem.empty()) {
+  if (const std::string problem = validateLimit(*limit, result.measurement()); !problem.empty()) {
     std::string text = formatMessage("the result %@ cannot be judged: %@", result.name(), problem);
     return {std::move(result), ResultVerdict::kFail, std::move(text)};
   }

@@ -22,7 +22,7 @@ enum class Verdict { kPass, kFail, kError };
 std::string_view nameOf(ResultVerdict verdict);  // "pass", "fail", "none"
 std::string_view nameOf(Verdict verdict);        // "pass", "fail", "error"
 
-// A measured result and the judge's word on it.
+// A measured result and its verdict.
 struct JudgedResult {
   QZMeasuredResult result;
   ResultVerdict verdict = ResultVerdict::kNone;

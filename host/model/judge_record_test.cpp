@@ -68,7 +68,7 @@ TEST(JudgeRecord, AgreesWithTheOracleOnEveryCombination) {
   EXPECT_EQ(rows, 85 * 8 * 3);
 }
 
-// What of a sequence of events the verdict must follow from.
+// The facts in a sequence of events that determine the verdict.
 struct Told {
   std::vector<QZMeasuredResult> results;
   bool hasError = false;
@@ -79,7 +79,7 @@ class RandomEvents {
  public:
   explicit RandomEvents(std::uint64_t seed) : random_(seed) {}
 
-  // Events as a plug-in's process could tell them, in any order, however little sense they make.
+  // A random sequence of events, as a plug-in's process could send it; it need not make sense.
   std::vector<RunEvent> sequence(Told* told) {
     std::vector<RunEvent> events = {beginningOf("A")};
     for (std::uint64_t i = random_.below(9); i > 0; --i) events.push_back(event(told));
@@ -113,7 +113,7 @@ class RandomEvents {
   RunEvent found(Told* told) {
     ResultsReported found;
     for (std::uint64_t i = random_.below(3); i > 0; --i) {
-      // Such that all verdicts are frequent.
+      // Chosen to make all verdicts frequent.
       if (random_.chance(10)) {
         found.results.push_back(random_.result());
       } else if (random_.chance(10)) {
@@ -143,7 +143,7 @@ TEST(JudgeRecord, AgreesWithTheOracleOnWhateverAPluginTells) {
     ASSERT_EQ(verdict, oracleVerdict(told.results, told.hasError, told.completed)) << i;
     ++count[static_cast<int>(verdict)];
 
-    // The verdict is verified by the events, and no other one is.
+    // Verification accepts this verdict and no other.
     events.insert(events.begin(), runOf({"A"}));
     ASSERT_TRUE(problemsOf(events).empty()) << i << ": " << problemsOf(events)[0];
     Verdict& stored = std::get<DiagnosticEnded>(events.back()).verdict;

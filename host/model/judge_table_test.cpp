@@ -1,4 +1,4 @@
-// Every value against every limit of a small world, and all short lists of results.
+// Every value against every limit of a small set, and all short lists of results.
 #include "host/testing/test_oracle.h"
 
 #include "host/testing/test_records.h"
@@ -19,7 +19,7 @@ constexpr double kNumbers[] = {-kInf, -1, -0.0, 0, std::numeric_limits<double>::
 
 using Bound = std::shared_ptr<const QZBound>;
 
-// No bound, and one at every number, open and closed, in the values' unit and in another one.
+// No bound, and bounds at every number, open and closed, in the unit of the values and in another unit.
 std::vector<Bound> allBounds() {
   std::vector<Bound> bounds = {nullptr};
   for (const double number : kNumbers) {

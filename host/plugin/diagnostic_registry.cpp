@@ -40,7 +40,7 @@ bool isWanted(const Diagnostic& one, Wanted wanted) {
   return one.usedBy.empty();
 }
 
-// What a name of its own reaches; a pattern that fits nothing else does too.
+// The entries that an exact name can select; a pattern can select them only if it matches no wanted entry.
 std::vector<Diagnostic> reachable(const std::vector<Diagnostic>& catalogue, Wanted wanted) {
   return wanted == Wanted::kDescribable ? catalogue : allOf(catalogue, wanted);
 }

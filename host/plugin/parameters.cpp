@@ -15,7 +15,7 @@ namespace quazor {
 
 namespace {
 
-// How a setting is called in messages: where it stands, and its text.
+// A setting as messages quote it: its source and its text.
 std::string quoted(OverridePlace place, const std::string& text) {
   const std::string where = place == OverridePlace::kEnvironment ? kSettingsVariable : "--set";
   return where + " '" + text + "'";
@@ -25,9 +25,9 @@ std::string_view sourceOf(OverridePlace place) {
   return place == OverridePlace::kEnvironment ? "environment" : "command line";
 }
 
-constexpr Part kHalves[] = {Part::kExperiment, Part::kAnalysis};
+constexpr Part kParts[] = {Part::kExperiment, Part::kAnalysis};
 
-// What several of them are called.
+// The noun for a list of them.
 std::string nounOf(const std::vector<DescribedDiagnostic>& diagnostics) {
   const auto isExperiment = [](const DescribedDiagnostic& one) { return one.diagnostic.experimentOnly; };
   if (std::all_of(diagnostics.begin(), diagnostics.end(), isExperiment)) return "experiments";
@@ -35,21 +35,21 @@ std::string nounOf(const std::vector<DescribedDiagnostic>& diagnostics) {
   return "diagnostics";
 }
 
-const OrderedMap<QZNumberParameter>& declared(const DescribedDiagnostic& diagnostic, Part half) {
+const OrderedMap<QZNumberParameter>& declared(const DescribedDiagnostic& diagnostic, Part part) {
   const DiagnosticDescription& description = diagnostic.description;
-  return (half == Part::kExperiment ? description.experiment : description.analysis).parameters();
+  return (part == Part::kExperiment ? description.experiment : description.analysis).parameters();
 }
 
-bool sets(const ParameterOverride& setting, Part half, std::string_view name) {
-  return (!setting.half || *setting.half == half) && setting.name == name;
+bool sets(const ParameterOverride& setting, Part part, std::string_view name) {
+  return (!setting.part || *setting.part == part) && setting.name == name;
 }
 
-// The names that the diagnostics declare in that half or, without one, in any.
-std::vector<std::string> declaredNames(const std::vector<DescribedDiagnostic>& diagnostics, std::optional<Part> half) {
+// The names of the parameters that the diagnostics declare in that part or, without one, in any.
+std::vector<std::string> declaredNames(const std::vector<DescribedDiagnostic>& diagnostics, std::optional<Part> part) {
   std::vector<std::string> names;
   for (const DescribedDiagnostic& diagnostic : diagnostics) {
-    for (const Part one : kHalves) {
-      if (half && *half != one) continue;
+    for (const Part one : kParts) {
+      if (part && *part != one) continue;
       for (const auto& [name, ignored] : declared(diagnostic, one)) names.push_back(name);
     }
   }
@@ -75,18 +75,18 @@ void checkEntry(const Profile& profile, const ProfileEntry& entry, const std::ve
     return one.description.isAsked && one.description.error == nullptr;
   });
   if (!allDescribed) return;
-  for (const Part half : kHalves) {
-    const std::vector<std::string> names = declaredNames(matched, half);
-    for (const auto& [name, ignored] : entry.values(half)) {
+  for (const Part part : kParts) {
+    const std::vector<std::string> names = declaredNames(matched, part);
+    for (const auto& [name, ignored] : entry.values(part)) {
       if (contains(names, name)) continue;
       throw CommandError(ExitCode::kCannotRead, "the " + profile.kind + " '" + profile.file.string() + "' sets '" +
-                                                    name + "', but no " + std::string(nameOf(half)) + " of '" +
+                                                    name + "', but no " + std::string(nameOf(part)) + " of '" +
                                                     entry.name + "' has that parameter" + didYouMean(name, names));
     }
   }
 }
 
-// What of the catalogue an entry of diagnostics, or one of experiments, fits.
+// The diagnostics or, with `ofExperiments`, the experiments that the entry matches.
 std::vector<DescribedDiagnostic> matchesOf(const ProfileEntry& entry, const std::vector<DescribedDiagnostic>& catalogue,
                                            bool ofExperiments) {
   std::vector<DescribedDiagnostic> matched;
@@ -97,32 +97,32 @@ std::vector<DescribedDiagnostic> matchesOf(const ProfileEntry& entry, const std:
   return matched;
 }
 
-// True when each parameter that the entry sets is declared by one of the diagnostics.
+// True if one of the diagnostics declares each parameter that the entry sets.
 bool declareAll(const std::vector<DescribedDiagnostic>& diagnostics, const ProfileEntry& entry) {
-  for (const Part half : kHalves) {
-    const std::vector<std::string> names = declaredNames(diagnostics, half);
-    for (const auto& [name, ignored] : entry.values(half)) {
+  for (const Part part : kParts) {
+    const std::vector<std::string> names = declaredNames(diagnostics, part);
+    for (const auto& [name, ignored] : entry.values(part)) {
       if (!contains(names, name)) return false;
     }
   }
   return true;
 }
 
-// Adds those of the matches that are in doubt.
+// Adds the undescribed matches if the described ones do not declare every parameter of the entry.
 void addDiagnosticsToDescribe(const ProfileEntry& entry, const std::vector<DescribedDiagnostic>& matched,
-                              std::vector<Diagnostic>& doubts) {
+                              std::vector<Diagnostic>& undescribed) {
   std::vector<DescribedDiagnostic> asked;
   std::copy_if(matched.begin(), matched.end(), std::back_inserter(asked),
                [](const DescribedDiagnostic& one) { return one.description.isAsked; });
   const auto couldNot = [](const DescribedDiagnostic& one) { return one.description.error != nullptr; };
-  // Without one that is asked, the entry does not matter; with one whose parameters are not known, it is passed over.
+  // An entry that matches nothing selected does not matter. checkProfile skips an entry with a failed description.
   if (asked.empty() || std::any_of(asked.begin(), asked.end(), couldNot) || declareAll(asked, entry)) return;
   for (const DescribedDiagnostic& one : matched) {
-    if (!one.description.isAsked && !contains(doubts, one.diagnostic)) doubts.push_back(one.diagnostic);
+    if (!one.description.isAsked && !contains(undescribed, one.diagnostic)) undescribed.push_back(one.diagnostic);
   }
 }
 
-// Checks the entries of diagnostics or those of experiments.
+// Checks the entries for diagnostics or those for experiments.
 void checkEntries(const Profile& profile, const std::vector<ProfileEntry>& entries,
                   const std::vector<DescribedDiagnostic>& catalogue, bool ofExperiments) {
   for (const ProfileEntry& entry : entries) {
@@ -142,26 +142,26 @@ void checkEntries(const Profile& profile, const std::vector<ProfileEntry>& entri
   }
 }
 
-const Value* findIn(const Profile& profile, const Diagnostic& diagnostic, Part half, std::string_view parameter) {
+const Value* findIn(const Profile& profile, const Diagnostic& diagnostic, Part part, std::string_view parameter) {
   return diagnostic.experimentOnly ? profile.findForExperiment(diagnostic.name, diagnostic.usedBy, parameter)
-                                   : profile.find(diagnostic.name, half, parameter);
+                                   : profile.find(diagnostic.name, part, parameter);
 }
 
-std::vector<ResolvedParameter> bindHalf(const DescribedDiagnostic& diagnostic, Part half,
-                                        const std::vector<Profile>& profiles,
-                                        const std::vector<ParameterOverride>& settings) {
+std::vector<ResolvedParameter> resolvePart(const DescribedDiagnostic& diagnostic, Part part,
+                                           const std::vector<Profile>& profiles,
+                                           const std::vector<ParameterOverride>& settings) {
   std::vector<ResolvedParameter> bound;
-  for (const auto& [name, declaration] : declared(diagnostic, half)) {
+  for (const auto& [name, declaration] : declared(diagnostic, part)) {
     ResolvedParameter parameter{name, declaration, std::nullopt, {}};
     for (const Profile& profile : profiles) {
-      const Value* const value = findIn(profile, diagnostic.diagnostic, half, name);
+      const Value* const value = findIn(profile, diagnostic.diagnostic, part, name);
       if (value == nullptr) continue;
       parameter.value = *value;
       parameter.source = profile.kind + " " + profile.file.filename().string();
     }
     for (const OverridePlace place : {OverridePlace::kEnvironment, OverridePlace::kCommandLine}) {
       for (const ParameterOverride& setting : settings) {
-        if (setting.place != place || !sets(setting, half, name)) continue;
+        if (setting.place != place || !sets(setting, part, name)) continue;
         parameter.value = setting.value;
         parameter.source = sourceOf(place);
       }
@@ -180,10 +180,10 @@ ParameterOverride parseOverride(const std::string& text, OverridePlace place) {
     throw CommandError(ExitCode::kUsage, what + "expected [experiment.|analysis.]NAME=VALUE");
   }
   ParameterOverride setting{text, std::nullopt, text.substr(0, equals), 0, place};
-  for (const Part half : kHalves) {
-    const std::string prefix = std::string(nameOf(half)) + ".";
-    if (setting.half || !setting.name.starts_with(prefix)) continue;
-    setting.half = half;
+  for (const Part part : kParts) {
+    const std::string prefix = std::string(nameOf(part)) + ".";
+    if (setting.part || !setting.name.starts_with(prefix)) continue;
+    setting.part = part;
     setting.name.erase(0, prefix.size());
   }
   if (setting.name.empty()) throw CommandError(ExitCode::kUsage, what + "the parameter name is missing");
@@ -218,21 +218,21 @@ void checkProfile(const Profile& profile, const std::vector<DescribedDiagnostic>
 
 std::vector<Diagnostic> diagnosticsToDescribe(const Profile& profile,
                                               const std::vector<DescribedDiagnostic>& catalogue) {
-  std::vector<Diagnostic> doubts;
+  std::vector<Diagnostic> undescribed;
   for (const ProfileEntry& entry : profile.entries)
-    addDiagnosticsToDescribe(entry, matchesOf(entry, catalogue, false), doubts);
+    addDiagnosticsToDescribe(entry, matchesOf(entry, catalogue, false), undescribed);
   for (const ProfileEntry& entry : profile.experiments)
-    addDiagnosticsToDescribe(entry, matchesOf(entry, catalogue, true), doubts);
-  return doubts;
+    addDiagnosticsToDescribe(entry, matchesOf(entry, catalogue, true), undescribed);
+  return undescribed;
 }
 
 void checkOverrides(const std::vector<ParameterOverride>& settings, const std::vector<DescribedDiagnostic>& selected) {
   for (std::size_t i = 0; i < settings.size(); ++i) {
     const ParameterOverride& setting = settings[i];
-    const std::vector<std::string> names = declaredNames(selected, setting.half);
+    const std::vector<std::string> names = declaredNames(selected, setting.part);
     if (!contains(names, setting.name)) {
       const std::string noun = nounOf(selected);
-      const std::string where = setting.half ? "no " + std::string(nameOf(*setting.half)) + " of the selected " + noun
+      const std::string where = setting.part ? "no " + std::string(nameOf(*setting.part)) + " of the selected " + noun
                                              : "none of the selected " + noun;
       throw CommandError(ExitCode::kUsage, quoted(setting.place, setting.text) + ": " + where + " has a parameter '" +
                                                setting.name + "'" + didYouMean(setting.name, names) +
@@ -241,7 +241,7 @@ void checkOverrides(const std::vector<ParameterOverride>& settings, const std::v
     for (std::size_t j = 0; j < i; ++j) {
       const ParameterOverride& other = settings[j];
       const bool overlap = other.place == setting.place && other.name == setting.name &&
-                           (!other.half || !setting.half || *other.half == *setting.half);
+                           (!other.part || !setting.part || *other.part == *setting.part);
       if (!overlap) continue;
       throw CommandError(ExitCode::kUsage, quoted(other.place, other.text) + " and " +
                                                quoted(setting.place, setting.text) + " set the same parameter twice");
@@ -251,16 +251,16 @@ void checkOverrides(const std::vector<ParameterOverride>& settings, const std::v
 
 ResolvedParameters resolveParameters(const DescribedDiagnostic& diagnostic, const std::vector<Profile>& profiles,
                                      const std::vector<ParameterOverride>& settings) {
-  return {bindHalf(diagnostic, Part::kExperiment, profiles, settings),
-          bindHalf(diagnostic, Part::kAnalysis, profiles, settings)};
+  return {resolvePart(diagnostic, Part::kExperiment, profiles, settings),
+          resolvePart(diagnostic, Part::kAnalysis, profiles, settings)};
 }
 
 void requireParameters(const DescribedDiagnostic& diagnostic, const ResolvedParameters& parameters) {
-  for (const Part half : kHalves) {
-    for (const ResolvedParameter& one : parameters.of(half)) {
+  for (const Part part : kParts) {
+    for (const ResolvedParameter& one : parameters.of(part)) {
       if (one.value || !one.declaration.required()) continue;
       const std::string name =
-          diagnostic.diagnostic.experimentOnly ? one.name : formatMessage("%@.%@", nameOf(half), one.name);
+          diagnostic.diagnostic.experimentOnly ? one.name : formatMessage("%@.%@", nameOf(part), one.name);
       throw CommandError(ExitCode::kUsage,
                          formatMessage("%@ requires the parameter %@; set it with --set %@=VALUE or in a profile",
                                        diagnostic.diagnostic.name, name, name));

@@ -22,7 +22,7 @@ inline constexpr const char* kSettingsVariable = "QUAZOR_SET";
 // One setting: [experiment.|analysis.]NAME=VALUE.
 struct ParameterOverride {
   std::string text;          // as it was written
-  std::optional<Part> half;  // nothing: wherever the parameter is declared
+  std::optional<Part> part;  // nothing: wherever the parameter is declared
   std::string name;
   Value value;
   OverridePlace place = OverridePlace::kCommandLine;
@@ -46,8 +46,8 @@ struct ResolvedParameters {
   std::vector<ResolvedParameter> experiment;  // in the order of their declaration
   std::vector<ResolvedParameter> analysis;
 
-  const std::vector<ResolvedParameter>& of(Part half) const {
-    return half == Part::kExperiment ? experiment : analysis;
+  const std::vector<ResolvedParameter>& of(Part part) const {
+    return part == Part::kExperiment ? experiment : analysis;
   }
 };
 

@@ -73,7 +73,7 @@ std::string refusalOf(ExitCode code, const std::function<void()>& action) {
 TEST(ParseSetting, TakesThePrefixAsTheHalf) {
   struct Row {
     const char* text;
-    std::optional<Part> half;
+    std::optional<Part> part;
     const char* name;
     Value value;
   };
@@ -87,7 +87,7 @@ TEST(ParseSetting, TakesThePrefixAsTheHalf) {
   };
   for (const Row& row : rows) {
     const ParameterOverride setting = parseOverride(row.text);
-    EXPECT_EQ(setting.half, row.half) << row.text;
+    EXPECT_EQ(setting.part, row.part) << row.text;
     EXPECT_EQ(setting.name, row.name) << row.text;
     EXPECT_EQ(setting.value, row.value) << row.text;
     EXPECT_EQ(setting.text, row.text);
@@ -198,7 +198,7 @@ TEST(CheckProfile, PassesOverAnEntryForSomethingThatWasNotDescribed) {
   EXPECT_THAT(check(R"({"Sync.Back": {"experiment": {"gain": 3}}})"), HasSubstr("sets 'gain'"));
 }
 
-TEST(InDoubt, IsWhatMightDeclareAParameterThatNothingDescribedDeclares) {
+TEST(DiagnosticsToDescribe, MightDeclareAParameterThatNothingDescribedDeclares) {
   DescribedDiagnostic other = diagnosticWith("Sync.Front", {}, {});
   other.description.isAsked = false;
   DescribedDiagnostic alone = imagesAlone();
@@ -211,12 +211,12 @@ TEST(InDoubt, IsWhatMightDeclareAParameterThatNothingDescribedDeclares) {
     const char* name;
     const char* diagnostics;
     const char* experiments;
-    std::vector<std::string> doubts;
+    std::vector<std::string> expected;
   };
   const Row rows[] = {
       {"a parameter that is declared", R"({"Sync.*": {"experiment": {"duration": 3}}})", "{}", {}},
       {"one that is not", R"({"Sync.*": {"experiment": {"gain": 3}}})", "{}", {"Sync.Front"}},
-      {"one of the other half", R"({"Sync.*": {"analysis": {"duration": 3}}})", "{}", {"Sync.Front"}},
+      {"one of the other part", R"({"Sync.*": {"analysis": {"duration": 3}}})", "{}", {"Sync.Front"}},
       {"two such entries",
        R"({"Sync.*": {"experiment": {"gain": 3}}, "S*": {"experiment": {"gain": 3}}})",
        "{}",
@@ -230,7 +230,7 @@ TEST(InDoubt, IsWhatMightDeclareAParameterThatNothingDescribedDeclares) {
     const Profile profile =
         parseProfile("some.json", std::string(R"({"schema": 1, "diagnostics": )") + row.diagnostics +
                                       R"(, "experiments": )" + row.experiments + "}");
-    EXPECT_EQ(namesOf(diagnosticsToDescribe(profile, catalogue)), row.doubts) << row.name;
+    EXPECT_EQ(namesOf(diagnosticsToDescribe(profile, catalogue)), row.expected) << row.name;
   }
 }
 
@@ -288,7 +288,7 @@ TEST(BindParameters, TakesTheValueOfTheLastPlaceThatHasOne) {
     EXPECT_EQ(bound.experiment[0].value, row.value) << row.source;
     EXPECT_EQ(bound.experiment[0].source, row.source);
   }
-  // What the later places do not hold is the earlier ones'.
+  // A later source without a value keeps the earlier one's.
   const ResolvedParameters bound = resolveParameters(fault(), profiles, {environment, commandLine});
   EXPECT_EQ(bound.experiment[1].value, Value(1));
   EXPECT_EQ(bound.experiment[1].source, "profile default.json");
@@ -311,7 +311,7 @@ TEST_F(SettingsOfEnvironment, AreSeparatedByWhiteSpace) {
   const std::vector<ParameterOverride> settings = overridesOfEnvironment();
   ASSERT_EQ(settings.size(), 3U);
   EXPECT_EQ(settings[0].name, "duration");
-  EXPECT_EQ(settings[1].half, Part::kAnalysis);
+  EXPECT_EQ(settings[1].part, Part::kAnalysis);
   EXPECT_EQ(settings[2].value, Value(5));
   for (const ParameterOverride& setting : settings) EXPECT_EQ(setting.place, OverridePlace::kEnvironment);
 }

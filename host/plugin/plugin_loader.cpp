@@ -39,7 +39,7 @@ void loadPlugin(const std::filesystem::path& file) {
   const QZLab& lab = QZLab::defaultLab();
   const std::size_t registered = lab.registrations().size();
   const std::size_t refused = lab.refusedNames().size();
-  // The absolute path has a slash, so that the linker opens this file and searches nowhere else.
+  // An absolute path contains a slash, so the linker opens this file and does not search for it.
   if (dlopen(std::filesystem::absolute(file).c_str(), RTLD_NOW | RTLD_LOCAL) == nullptr) {
     const char* message = dlerror();
     refuseUnlinkable(file, message == nullptr ? "the dynamic linker gives no reason" : message);
@@ -110,7 +110,7 @@ std::vector<LoadedPlugin> loadPlugins(const std::vector<std::filesystem::path>& 
 void loadSomePlugins(const std::vector<std::filesystem::path>& files) { loadEach(files, nullptr); }
 
 std::optional<int> contractVersionIn(std::string_view linkerMessage) {
-  // The mangled name of the contract's namespace: 6quazor, the next name's length, contract_, the version.
+  // The mangled name of the contract's namespace: 6quazor, the length of the next name, contract_, the version.
   constexpr std::string_view kNamespace = "6quazor";
   constexpr std::string_view kContract = "contract_";
   const std::size_t found = linkerMessage.find(kNamespace);

@@ -5,7 +5,7 @@
 namespace quazor {
 namespace {
 
-// What becomes of real files is seen in command_line_test.py: each needs a process of its own.
+// command_line_test.py covers real files, because each needs a separate process.
 TEST(ContractVersionIn, IsThatOfTheMissingSymbol) {
   struct Row {
     const char* name;

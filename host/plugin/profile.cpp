@@ -27,11 +27,11 @@ OrderedMap<Value> valuesIn(const JsonCursor& entry, std::string_view key) {
   return object ? valuesOf(*object) : OrderedMap<Value>();
 }
 
-const Value* findIn(const std::vector<ProfileEntry>& entries, const std::string& name, Part half,
+const Value* findIn(const std::vector<ProfileEntry>& entries, const std::string& name, Part part,
                     std::string_view parameter) {
   const Value* found = nullptr;
   for (const ProfileEntry& entry : entries) {
-    const Value* value = entry.values(half).find(parameter);
+    const Value* value = entry.values(part).find(parameter);
     if (value == nullptr || !matchesName(entry.name, name)) continue;
     if (entry.name == name) return value;
     found = value;
@@ -58,10 +58,10 @@ Profile profileOf(const std::filesystem::path& file, const JsonDocument& json) {
 
 }  // namespace
 
-std::string_view nameOf(Part half) { return half == Part::kExperiment ? "experiment" : "analysis"; }
+std::string_view nameOf(Part part) { return part == Part::kExperiment ? "experiment" : "analysis"; }
 
-const Value* Profile::find(const std::string& diagnostic, Part half, std::string_view parameter) const {
-  return findIn(entries, diagnostic, half, parameter);
+const Value* Profile::find(const std::string& diagnostic, Part part, std::string_view parameter) const {
+  return findIn(entries, diagnostic, part, parameter);
 }
 
 const Value* Profile::findForExperiment(const std::string& experiment, const std::vector<std::string>& usedBy,

@@ -64,9 +64,9 @@ TEST(ParseProfile, RefusesWhatIsNotExactlyOfTheForm) {
       {"an unknown key", R"({"schema": 1, "diagnostic": {}})",
        "1: the document: unknown key \"diagnostic\"; did you mean \"diagnostics\"?"},
       {"an entry that is no object", withDiagnostics(R"({"A": 3})"), "1: diagnostics.A: must be an object, not 3."},
-      {"an unknown half", withDiagnostics(R"({"A": {"experimant": {}}})"),
+      {"an unknown part", withDiagnostics(R"({"A": {"experimant": {}}})"),
        "1: diagnostics.A: unknown key \"experimant\"; did you mean \"experiment\"?"},
-      {"a half that is no object", withDiagnostics(R"({"A": {"analysis": []}})"),
+      {"a part that is no object", withDiagnostics(R"({"A": {"analysis": []}})"),
        "1: diagnostics.A.analysis: must be an object, not an array."},
       {"a value that is text", withDiagnostics(R"({"A": {"experiment": {"x": "3"}}})"),
        "1: diagnostics.A.experiment.x: must be a number, not \"3\"."},
@@ -149,7 +149,7 @@ TEST(Profile, FindsTheValueOfTheEntryThatWins) {
   struct Row {
     const char* name;
     const char* diagnostic;
-    Part half;
+    Part part;
     const char* parameter;
     std::optional<Value> value;
   };
@@ -159,12 +159,12 @@ TEST(Profile, FindsTheValueOfTheEntryThatWins) {
       {"a pattern's value", "A.Else", Part::kExperiment, "x", Value(2)},
       {"the later of two patterns wins", "A.Two", Part::kExperiment, "x", Value(5)},
       {"the earlier pattern gives what the later leaves out", "A.Two", Part::kExperiment, "y", Value(3)},
-      {"the other half has its own values", "A.Two", Part::kAnalysis, "x", Value(4)},
+      {"the other part has its own values", "A.Two", Part::kAnalysis, "x", Value(4)},
       {"a parameter that no entry holds", "A.One", Part::kAnalysis, "y", std::nullopt},
       {"a diagnostic that no entry fits", "B.One", Part::kExperiment, "x", std::nullopt},
   };
   for (const Row& row : rows) {
-    const Value* value = profile.find(row.diagnostic, row.half, row.parameter);
+    const Value* value = profile.find(row.diagnostic, row.part, row.parameter);
     EXPECT_EQ(value == nullptr ? std::nullopt : std::optional(*value), row.value) << row.name;
   }
 }

@@ -26,11 +26,11 @@ bool isWithin(std::uint64_t offset, std::uint64_t count, std::uint64_t size) {
   return offset <= size && count <= size - offset;
 }
 
-// Every segment that the headers promise must be in the file.
+// True if the file contains every segment that its headers list.
 bool hasAllSegments(std::ifstream& file, std::uint64_t size) {
   Elf64_Ehdr header;
   if (!readAt(file, 0, &header, sizeof header)) return false;
-  if (header.e_phentsize != sizeof(Elf64_Phdr)) return true;  // the linker's to refuse
+  if (header.e_phentsize != sizeof(Elf64_Phdr)) return true;  // left to the linker
   for (std::uint64_t i = 0; i < header.e_phnum; ++i) {
     const std::uint64_t offset = header.e_phoff + i * sizeof(Elf64_Phdr);
     Elf64_Phdr segment;
@@ -58,7 +58,7 @@ void validateSharedObject(const std::filesystem::path& path) {
     throw InputError("is not a shared object");
   }
   if (!readAt(file, 0, identity, EI_NIDENT)) throw InputError(kTruncated);
-  if (identity[EI_CLASS] != ELFCLASS64) return;  // another machine's: the linker's to refuse
+  if (identity[EI_CLASS] != ELFCLASS64) return;  // another architecture: left to the linker
   if (!hasAllSegments(file, size)) throw InputError(kTruncated);
 }
 

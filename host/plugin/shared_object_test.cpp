@@ -11,14 +11,14 @@
 namespace quazor {
 namespace {
 
-// This test's own program: an ELF file that the dynamic linker has mapped.
+// The test program itself is an ELF file that the dynamic linker has mapped.
 std::string ownProgram() {
   std::ostringstream content;
   content << std::ifstream("/proc/self/exe", std::ios::binary).rdbuf();
   return content.str();
 }
 
-// Empty when nothing is wrong with the file.
+// Empty if the file is valid.
 std::string problemOf(const std::filesystem::path& file) {
   try {
     validateSharedObject(file);
@@ -56,14 +56,14 @@ TEST(ValidateSharedObject, FindsEveryTruncation) {
 TEST(ValidateSharedObject, DoesNotBelieveImpossibleOffsets) {
   const TestDirectory directory;
   std::string content = ownProgram();
-  for (std::size_t i = 32; i < 40; ++i) content[i] = '\xFF';  // where the program headers are
+  for (std::size_t i = 32; i < 40; ++i) content[i] = '\xFF';  // the offset of the program headers
   EXPECT_EQ(problemOf(directory.write("wild.so", content)), "is a truncated shared object");
 }
 
 TEST(ValidateSharedObject, LeavesAnotherMachinesFileToTheLinker) {
   const TestDirectory directory;
   std::string content = ownProgram();
-  content[4] = 1;  // 32 bits
+  content[4] = 1;  // ELFCLASS32
   EXPECT_EQ(problemOf(directory.write("small.so", content)), "");
 }
 

@@ -18,7 +18,7 @@ using Json = nlohmann::ordered_json;
 
 namespace {
 
-// Of values in values: more than anything needs, and few enough for the stack.
+// The nesting limit: more than any diagnostic needs, and small enough for the stack.
 constexpr int kMaxLevels = 500;
 
 class DescribedObject final : public Object {
@@ -61,7 +61,7 @@ const Json& arrayIn(const Json& json) {
   return json;
 }
 
-// `levels` are those that may still be in it.
+// `levels` is the number of levels that may still follow.
 Value nestedValueFrom(const Json& json, int levels);
 
 Value arrayFrom(const Json& json, int levels) {

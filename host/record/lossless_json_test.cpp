@@ -17,7 +17,7 @@ namespace {
 using Json = nlohmann::ordered_json;
 using testing::HasSubstr;
 
-// As a record keeps it: as text, in which nothing had to be replaced.
+// Formats and parses it, like a record. The formatting replaces nothing.
 Json throughText(const Json& json) { return Json::parse(json.dump()); }
 
 Value back(const Value& value) { return valueFrom(throughText(losslessValue(value))); }
@@ -41,7 +41,7 @@ TEST(LosslessValue, KeepsEveryValue) {
 }
 
 TEST(LosslessValue, KeepsFloatsOfEveryKind) {
-  // One in 80,021, which is a prime: every sign, every exponent, and mantissas of all kinds.
+  // Every 80,021st number. The step is prime, so all signs and exponents and many kinds of mantissas occur.
   std::uint64_t count = 0;
   for (std::uint64_t bits = 0; bits <= UINT32_MAX; bits += 80'021) {
     const Value value(std::bit_cast<float>(static_cast<std::uint32_t>(bits)));
@@ -82,7 +82,7 @@ TEST(LosslessValue, HasThisForm) {
   EXPECT_EQ(losslessText("a\xff").dump(), R"({"hex":"61ff"})");
 }
 
-TEST(LosslessText, TellsUtf8FromOtherOctets) {
+TEST(LosslessText, TellsUtf8FromOtherBytes) {
   struct Row {
     const char* name;
     std::string text;
@@ -90,27 +90,27 @@ TEST(LosslessText, TellsUtf8FromOtherOctets) {
   };
   const Row rows[] = {
       {"nothing", "", true},
-      {"the octet zero", std::string(1, '\0'), true},
-      {"the first of two octets", "\xc2\x80", true},
-      {"the last of two octets", "\xdf\xbf", true},
+      {"the byte zero", std::string(1, '\0'), true},
+      {"the first of two bytes", "\xc2\x80", true},
+      {"the last of two bytes", "\xdf\xbf", true},
       {"a longer form than needed, of two", "\xc1\xbf", false},
-      {"the first of three octets", "\xe0\xa0\x80", true},
+      {"the first of three bytes", "\xe0\xa0\x80", true},
       {"a longer form than needed, of three", "\xe0\x9f\xbf", false},
       {"the last before the surrogates", "\xed\x9f\xbf", true},
       {"the first surrogate", "\xed\xa0\x80", false},
       {"the first after the surrogates", "\xee\x80\x80", true},
-      {"the last of three octets", "\xef\xbf\xbf", true},
-      {"the first of four octets", "\xf0\x90\x80\x80", true},
+      {"the last of three bytes", "\xef\xbf\xbf", true},
+      {"the first of four bytes", "\xf0\x90\x80\x80", true},
       {"a longer form than needed, of four", "\xf0\x8f\xbf\xbf", false},
-      {"the last of four octets", "\xf4\x8f\xbf\xbf", true},
+      {"the last of four bytes", "\xf4\x8f\xbf\xbf", true},
       {"beyond the last", "\xf4\x90\x80\x80", false},
-      {"an octet that never begins anything", "\xf5\x80\x80\x80", false},
-      {"a following octet alone", "\x80", false},
-      {"two octets without the second", "\xc2", false},
-      {"three octets without the third", "\xe2\x82", false},
-      {"four octets without the fourth", "\xf0\x9f\x98", false},
-      {"a third octet that does not follow", "\xe2\x82z", false},
-      {"a fourth octet that does not follow", "\xf0\x9f\x98z", false},
+      {"a byte that never begins anything", "\xf5\x80\x80\x80", false},
+      {"a following byte alone", "\x80", false},
+      {"two bytes without the second", "\xc2", false},
+      {"three bytes without the third", "\xe2\x82", false},
+      {"four bytes without the fourth", "\xf0\x9f\x98", false},
+      {"a third byte that does not follow", "\xe2\x82z", false},
+      {"a fourth byte that does not follow", "\xf0\x9f\x98z", false},
   };
   for (const Row& row : rows) {
     const Json json = losslessText(row.text);

@@ -9,7 +9,7 @@ namespace {
 
 std::filesystem::path directoryIn(const char* variable) {
   const char* const value = std::getenv(variable);
-  // A relative path is to be ignored, as the rules of base directories have it.
+  // The XDG base directory rules require that relative paths are ignored.
   return value != nullptr && *value == '/' ? value : "";
 }
 

@@ -1,4 +1,4 @@
-// The record of the last run, which is kept automatically.
+// The record of the previous run, which is kept automatically.
 #pragma once
 
 #include "host/record/record_file.h"
@@ -9,8 +9,8 @@
 
 namespace quazor {
 
-// $XDG_STATE_HOME/quazor/last_run.jsonl, by default in ~/.local/state (XDG base directories). Empty
-// when the environment tells neither.
+// $XDG_STATE_HOME/quazor/last_run.jsonl, by default in ~/.local/state (XDG base directories). Empty if the environment
+// has neither variable.
 std::filesystem::path previousRunFile();
 
 // The names, in order, of the diagnostics that did not pass, did not finish, or were selected but never started.

@@ -22,7 +22,7 @@ namespace {
 
 using Json = nlohmann::ordered_json;
 
-constexpr mode_t kMode = 0666;  // less the umask
+constexpr mode_t kMode = 0666;  // reduced by the umask
 
 [[noreturn]] void refuseLine(const std::filesystem::path& file, std::uint64_t line, const std::string& why) {
   throw CommandError(ExitCode::kCannotRead,
@@ -69,7 +69,7 @@ RecordWriter::RecordWriter(std::filesystem::path file) : file_(std::move(file)) 
   if (std::filesystem::exists(file_, ignored) && !std::filesystem::is_regular_file(file_, ignored)) {
     descriptor_ = ::open(file_.c_str(), O_WRONLY | O_CLOEXEC);
   } else {
-    // A link stays, and what it names is replaced.
+    // Resolves a symbolic link, because the rename below would replace the link itself.
     std::error_code error;
     const std::filesystem::path canonical = std::filesystem::weakly_canonical(file_, error);
     const std::filesystem::path target = error ? file_ : canonical;
@@ -92,7 +92,7 @@ void RecordWriter::onEvent(const RunEvent& event, const std::string& line) {
   ++taken_;
   if (!problem_.empty()) return;
   write(line);
-  // What a run comes to must survive the machine, too.
+  // The outcome of a run must survive a crash of the machine.
   if (std::holds_alternative<RunEnded>(event) && problem_.empty()) ::fdatasync(descriptor_);
 }
 

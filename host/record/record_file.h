@@ -50,17 +50,17 @@ struct StoredRecord {
   bool cutOff = false;  // the last line is incomplete and not included in the events
 };
 
-// Throws a CommandError (kCannotRead) that names file and line when the file cannot be read or is no record.
+// Throws a CommandError (kCannotRead) that names file and line if the file cannot be read or is not a record.
 StoredRecord readRecord(const std::filesystem::path& file);
 
 // The run stored in a record. Incomplete diagnostics have the verdict kError.
 struct RecordedRun {
   RunStarted began;
   std::vector<DiagnosticRecord> records;
-  std::optional<RunEnded> ended;  // nothing: the run did not come to its end
+  std::optional<RunEnded> ended;  // nothing: the run did not end
 };
 
-// The run that a record holds, as far as it came. Throws the Refusals of readRecord.
+// The run in a record, which may be incomplete. Throws like readRecord().
 RecordedRun runIn(const std::filesystem::path& file);
 
 }  // namespace quazor

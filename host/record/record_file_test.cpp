@@ -182,7 +182,7 @@ TEST_F(RecordFileTest, TakesThePlaceOfAnOldFileAtOnce) {
   const RecordWriter writer(file_);
   EXPECT_EQ(directory_.read("record"), "");
   char text[4] = {};
-  EXPECT_EQ(::read(old, text, sizeof text), 3);  // whoever reads the old one is not disturbed
+  EXPECT_EQ(::read(old, text, sizeof text), 3);  // readers of the old file are not affected
   ::close(old);
   EXPECT_EQ(std::distance(fs::directory_iterator(directory_.path()), fs::directory_iterator()), 1);
 }
@@ -236,7 +236,7 @@ TEST_F(RecordFileTest, EndsInACutOffLineWhenTheDiskIsFull) {
   ASSERT_EQ(getrlimit(RLIMIT_FSIZE, &before), 0);
   const auto handler = std::signal(SIGXFSZ, SIG_IGN);
   RecordWriter writer(file_);
-  const rlimit small{700, before.rlim_max};  // octets that a file may have
+  const rlimit small{700, before.rlim_max};  // maximum file size in bytes
   ASSERT_EQ(setrlimit(RLIMIT_FSIZE, &small), 0);
   for (const RunEvent& event : wholeRun()) writer.onEvent(event);
   setrlimit(RLIMIT_FSIZE, &before);

@@ -1,4 +1,4 @@
-// Events in JSON: a line of a record, and of the connection between quazor and a diagnostic's process.
+// Events in JSON: the lines of a record and of the connection between quazor and a plug-in process.
 // docs/record_format.md is the public description.
 #pragma once
 
@@ -13,9 +13,9 @@ nlohmann::ordered_json eventJson(const RunEvent& event);
 // Throws InputError if the JSON is not an event.
 RunEvent eventFrom(const nlohmann::ordered_json& json);
 
-// What is run: name, summary, halves and who uses it.
+// The name, summary and parts of a diagnostic, and the diagnostics that use it.
 nlohmann::ordered_json diagnosticJson(const Diagnostic& diagnostic);
-// Without factories. Throws InputError.
+// The result has no factories. Throws InputError.
 Diagnostic diagnosticFrom(const nlohmann::ordered_json& json);
 
 nlohmann::ordered_json descriptionJson(const DiagnosticDescription& description);

@@ -34,7 +34,7 @@ struct EventRow {
   const char* json;
 };
 
-// Each event with everything that it can have.
+// Each event with all of its members.
 std::vector<EventRow> rows() {
   RunStarted run = runOf({"Good", "B\xff"});
   run.ofExperiments = true;
@@ -149,7 +149,7 @@ TEST(EventFrom, KnowsEveryStageLevelAndVerdict) {
   }
 }
 
-// What an event may be without.
+// True if the member is optional in the event.
 bool isOptional(const std::string& event, const std::string& key) {
   return (event == "failed" && key == "stage") || (event == "stageEnded" && key == "nanoseconds") ||
          (event == "runEnded" && key == "interrupted");
@@ -179,7 +179,7 @@ TEST(EventFrom, RefusesMembersOfAnotherKind) {
         changed[key] = Json::parse(other);
         if (changed[key].type() == member.type() && member.is_string() && key != "event" && key != "date" &&
             key != "stage" && key != "level" && key != "verdict") {
-          continue;  // any text
+          continue;  // any text is valid
         }
         EXPECT_NE(problemOf(changed), "accepted") << key << " as " << other << " in " << row.json;
       }

@@ -11,7 +11,7 @@ using Json = nlohmann::ordered_json;
 
 namespace {
 
-// A 32-bit float as the double that reads the same: 36.6, not 36.599998474121094.
+// The double with the same shortest decimal form as the 32-bit float: 36.6, not 36.599998474121094.
 Json floatJson(float number) {
   if (!std::isfinite(number)) return numberJson(static_cast<double>(number));
   const std::string text = defaultText(number);

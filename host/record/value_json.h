@@ -18,11 +18,11 @@ nlohmann::ordered_json numberJson(double number);
 // Seconds.
 nlohmann::ordered_json secondsJson(std::chrono::nanoseconds duration);
 
-// Numbers keep their kind, 32-bit floats their shortest decimal form, and not-finite ones follow numberJson; bytes are
-// hexadecimal text; dates, objects and errors are their default text.
+// Numbers keep their kind, 32-bit floats use their shortest decimal form, non-finite ones follow numberJson(). Bytes
+// become hexadecimal text; dates, objects and errors become their default text.
 nlohmann::ordered_json valueJson(const Value& value);
 
-// An object with a key for each entry, made in linear time: the map has found out that no key is there twice.
+// An object with one key per entry. Linear in the number of entries, because the map's keys are known to be unique.
 template <class T, class ToJson>
 nlohmann::ordered_json objectJson(const OrderedMap<T>& map, ToJson&& toJson) {
   nlohmann::ordered_json::object_t object;
@@ -35,8 +35,7 @@ nlohmann::ordered_json dictionaryJson(const Dictionary& dictionary);
 // The error's dictionary form, or null.
 nlohmann::ordered_json errorJson(const DiagnosticErrorPtr& error);
 
-// The document as text, indented by two spaces, with a closing newline. Text that is not UTF-8 has U+FFFD where it is
-// not.
+// The document as text, indented by two spaces, with a closing newline. U+FFFD replaces invalid UTF-8.
 std::string documentText(const nlohmann::ordered_json& document);
 
 }  // namespace quazor

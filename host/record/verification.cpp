@@ -12,7 +12,7 @@ namespace quazor {
 
 namespace {
 
-// The host could not write a record, which has nothing to do with what the diagnostic told.
+// True for the host's failure to write a record, which is independent of the diagnostic's events.
 bool isNotRecorded(const DiagnosticError& error) {
   return error.domain() == QuazorHostErrorDomain &&
          error.code() == static_cast<std::int64_t>(HostErrorCode::kNotRecorded);
@@ -27,7 +27,7 @@ class Verifier {
  public:
   void onEvent(const RunEvent& event) {
     if (const auto* const failed = std::get_if<Failed>(&event); failed != nullptr && !failed->stage) {
-      hostError_ = failed->error;  // the host's own, which must follow from the rest
+      hostError_ = failed->error;  // the host's own error, which must follow from the other events
       if (!builder_.isOpen()) add("a failure is recorded outside of any diagnostic");
       return;
     }

@@ -19,7 +19,7 @@ using testing::IsEmpty;
 
 using Events = std::vector<RunEvent>;
 
-// The place of the event of that kind in the diagnostic of that name.
+// The position of the event of that type in the diagnostic with that name.
 template <class Event>
 Events::iterator find(Events& events, const std::string& diagnostic) {
   const auto begin = std::find_if(events.begin(), events.end(), [&](const RunEvent& event) {
@@ -199,7 +199,7 @@ TEST(ProblemsOf, FindsADiagnosticThatWasTakenOut) {
   EXPECT_THAT(problemsAfter(without), ElementsAre("Bad was selected to run but is missing from the record"));
   EXPECT_THAT(problemsAfter([&](Events& events) {
                 without(events);
-                events.back() = RunEnded{"Broken", momentAt(99)};  // as if it had not come so far
+                events.back() = RunEnded{"Broken", momentAt(99)};  // as if the user had interrupted the run
               }),
               IsEmpty());
 }

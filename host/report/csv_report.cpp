@@ -13,7 +13,7 @@ namespace quazor {
 
 namespace {
 
-// The columns' groups, from left to right; in a group columns are in the order of their names.
+// Groups of columns, from left to right. Within a group, columns are sorted by name.
 enum class Group { kExperiment, kImage, kOfImage, kSample, kSamples, kMeasurement, kValue, kUnit };
 using Column = std::pair<Group, std::string>;
 using Row = std::map<Column, std::string>;
@@ -45,7 +45,7 @@ void visitImage(const Row& base, const Dictionary& image, Visit&& visit) {
   }
 }
 
-// Calls `visit` with every row, one at a time.
+// Calls `visit` for each row.
 template <class Visit>
 void visitRows(const std::vector<DiagnosticRecord>& records, Visit&& visit) {
   for (const DiagnosticRecord& record : records) {
@@ -80,7 +80,7 @@ const std::vector<std::string_view> kDiagnosticColumns = {
     "diagnostic", "verdict",   "result",        "value",      "unit",        "limit",     "lower",       "lowerOpen",
     "upper",      "upperOpen", "resultVerdict", "errorStage", "errorDomain", "errorCode", "errorMessage"};
 
-// The four cells of a limit's bounds, and its name before them.
+// Appends the name of the limit and the four cells of its bounds.
 void addLimit(std::vector<std::string>& cells, const std::optional<QZLimit>& limit) {
   cells.push_back(limit ? limit->name() : std::string());
   for (const auto which : {&QZLimit::lowerBound, &QZLimit::upperBound}) {
@@ -90,7 +90,7 @@ void addLimit(std::vector<std::string>& cells, const std::optional<QZLimit>& lim
   }
 }
 
-// A line of the diagnostic; `judged` is null for one without results.
+// Appends one line. `judged` is null if the diagnostic has no results.
 void appendDiagnosticLine(std::string& csv, const DiagnosticRecord& record, const JudgedResult* judged) {
   std::vector<std::string> cells{record.name, std::string(nameOf(record.verdict))};
   if (judged != nullptr) {

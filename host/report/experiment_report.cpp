@@ -17,11 +17,11 @@ namespace quazor {
 namespace {
 
 constexpr std::size_t kWidth = 80;
-// Fewer samples are easier to read as numbers; more columns do not fit.
+// Fewer samples are easier to read as numbers; more do not fit.
 constexpr std::size_t kMinDrawn = 8;
 constexpr std::size_t kMaxDrawn = 64;
 
-// "min 1, max 9": the lowest and the highest that are finite, as they are.
+// "min 1, max 9": the least and the greatest finite sample, unrounded.
 std::string rangeOf(const Array& samples) {
   const Value* lowest = nullptr;
   const Value* highest = nullptr;
@@ -35,7 +35,7 @@ std::string rangeOf(const Array& samples) {
   return formatMessage("min %@, max %@", *lowest, *highest);
 }
 
-// `first`, then the items with commas between them, in lines that end before the width wherever an item can.
+// Prints `first` and then the items, separated by commas. Breaks lines at kWidth where possible.
 void printWrapped(std::ostream& out, const std::string& first, const std::vector<std::string>& items,
                   const std::string& indent) {
   std::string line = indent + first;

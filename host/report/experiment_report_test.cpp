@@ -21,7 +21,7 @@ std::string printed(const Dictionary& data, bool blocks = false) {
   return out.str();
 }
 
-// `count` numbers from 0 on.
+// The numbers from 0 to `count` - 1.
 Array ramp(int count) {
   Array samples;
   for (int i = 0; i < count; ++i) samples.emplace_back(i);
@@ -120,7 +120,7 @@ TEST(PrintAuxiliaryData, KeepsImagesWithin80Columns) {
 }
 
 TEST(PrintAuxiliaryData, FillsALineToTheLastColumn) {
-  // Two blanks, "s:", a blank and the item.
+  // Two spaces, "s:", a space and the item.
   const std::string exact(80 - 5 - 4, 'x');
   EXPECT_THAT(printed({{"s", Dictionary{{"key", exact}, {"i", Array{1}}}}}),
               testing::StartsWith("  s: key " + exact + "\n"));

@@ -76,7 +76,7 @@ Json durationJson(const std::optional<std::chrono::nanoseconds>& duration) {
   return duration ? secondsJson(*duration) : Json();
 }
 
-// What a half declares, with the values of a run.
+// The declared parameters of an experiment or analysis, with the values of a run.
 Json declarationJson(const std::string& name, const QZDescription& description,
                      const std::vector<ResolvedParameter>& parameters) {
   Json json = Json::array();

@@ -16,12 +16,12 @@ std::string valueText(const Measurement& measurement) {
   return formatMessage("%@ %@", measurement.value(), measurement.unit().symbol());
 }
 
-void addParameters(JUnitProperties& properties, std::string_view half,
+void addParameters(JUnitProperties& properties, std::string_view part,
                    const std::vector<ResolvedParameter>& parameters) {
   for (const ResolvedParameter& one : parameters) {
     if (!one.value) continue;
-    properties.add(formatMessage("parameter.%@.%@", half, one.name), defaultText(*one.value));
-    properties.add(formatMessage("source.%@.%@", half, one.name), one.source);
+    properties.add(formatMessage("parameter.%@.%@", part, one.name), defaultText(*one.value));
+    properties.add(formatMessage("source.%@.%@", part, one.name), one.source);
   }
 }
 
@@ -45,7 +45,7 @@ JUnitProperties propertiesOf(const JudgedResult& judged) {
   return properties;
 }
 
-// A result that cannot be judged is an error, not a failure, which would be the hardware's.
+// A result that cannot be judged is an error; a failure would blame the hardware.
 void addResult(JUnitSuite& suite, const JudgedResult& judged) {
   const QZMeasuredResult& result = judged.result;
   const JUnitProperties properties = propertiesOf(judged);
@@ -58,7 +58,7 @@ void addResult(JUnitSuite& suite, const JudgedResult& judged) {
       formatMessage("%@ is %@, limit %@", result.name(), valueText(result.measurement()), limitText(result.limit())));
 }
 
-// What an experiment on its own measured.
+// Adds the measurements of an experiment on its own.
 void addExperiment(JUnitSuite& suite, const DiagnosticRecord& record) {
   JUnitProperties properties;
   for (const auto& [name, measurement] : record.measurements) {

@@ -19,7 +19,7 @@ std::string attribute(std::string_view name, std::string_view value) {
   return formatMessage(" %@=\"%@\"", name, xmlAttribute(value));
 }
 
-// Seconds, to the millisecond.
+// Seconds with three decimals.
 std::string secondsText(std::chrono::nanoseconds duration) {
   const std::int64_t milliseconds = std::chrono::duration_cast<std::chrono::milliseconds>(duration).count();
   const std::string rest = std::to_string(milliseconds % 1000);
@@ -36,7 +36,7 @@ std::string JUnitProperties::xml(const std::string& indent) const {
   if (elements_.empty()) return {};
   std::string lines;
   for (std::string_view rest = elements_; !rest.empty();) {
-    const std::size_t length = rest.find('\n') + 1;  // attributes hold none
+    const std::size_t length = rest.find('\n') + 1;  // attribute values contain no line feed
     lines += indent + "  ";
     lines += rest.substr(0, length);
     rest.remove_prefix(length);
@@ -60,7 +60,7 @@ std::string junitTag(const std::string& element, const std::string& name, const 
          attribute("timestamp", timestampText(begin)) + ">\n";
 }
 
-// The wall clock may have been set back in between.
+// The end may precede the begin if the wall clock was set back.
 JUnitSuite::JUnitSuite(std::string name, Date begin, Date end) : name_(std::move(name)), begin_(begin) {
   counts_.time = std::max<std::chrono::nanoseconds>(end - begin, std::chrono::nanoseconds::zero());
 }

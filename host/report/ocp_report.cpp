@@ -18,16 +18,16 @@ using Json = nlohmann::ordered_json;
 
 namespace {
 
-// The steps' identifiers, and the beginning of their names.
+// The IDs of the steps, which are also the prefixes of their names.
 constexpr const char* kExperimentStep = "experiment";
 constexpr const char* kAnalysisStep = "analysis";
 
-// The key of an empty text is left out: it has no value.
+// Omits the key if the text is empty.
 void addText(Json& json, const char* key, const std::string& text) {
   if (!text.empty()) json[key] = text;
 }
 
-// As a word of a shell's command.
+// Quotes the text as one word of a shell command.
 std::string quoted(const std::string& text) {
   constexpr std::string_view kPlain = "ABCDEFGHIJKLMNOPQRSTUVWXYZabcdefghijklmnopqrstuvwxyz0123456789_./:=,+-";
   if (!text.empty() && text.find_first_not_of(kPlain) == std::string::npos) return text;
@@ -42,26 +42,26 @@ std::string quoted(const std::string& text) {
   return word + "'";
 }
 
-// `before` is what stands between the line and the word, blanks too.
+// Appends `before`, which includes blanks, and the quoted word.
 void addWord(std::string& line, std::string_view before, const std::string& word) {
   line += before;
   line += quoted(word);
 }
 
-void addSettings(std::string& line, std::string_view half, const std::vector<ResolvedParameter>& parameters) {
+void addSettings(std::string& line, std::string_view part, const std::vector<ResolvedParameter>& parameters) {
   for (const ResolvedParameter& one : parameters) {
-    if (one.value) addWord(line, " --set ", formatMessage("%@.%@=%@", half, one.name, *one.value));
+    if (one.value) addWord(line, " --set ", formatMessage("%@.%@=%@", part, one.name, *one.value));
   }
 }
 
-// The command that runs them again, and nothing else.
+// The command that repeats exactly this run.
 std::string commandOf(const RunStarted& run, const std::vector<std::string>& names,
                       const ResolvedParameters& parameters) {
   std::string line = run.ofExperiments ? "quazor experiment" : "quazor run";
   for (const std::string& name : names) addWord(line, " ", name);
   for (const std::string& plugin : run.plugins) addWord(line, " --plugin ", plugin);
   if (!run.phone.empty()) addWord(line, " --phone ", run.phone);
-  if (!bindingNamed(run.phone)) line += " --seed " + std::to_string(run.seed);  // a real phone has none
+  if (!bindingNamed(run.phone)) line += " --seed " + std::to_string(run.seed);  // no effect on a real phone
   line += " --profile none";
   addSettings(line, "experiment", parameters.experiment);
   addSettings(line, "analysis", parameters.analysis);
@@ -92,7 +92,7 @@ Json startJson(const RunStarted& run, const std::string& name, std::string comma
 
 std::string symptomOf(const DiagnosticError& error) { return formatMessage("%@:%@", error.domain(), error.code()); }
 
-// The error and those that caused it, the nearest first; `add` takes one artifact.
+// Calls `add` with an artifact for the error and for each underlying error, the nearest first.
 template <class Add>
 void addErrors(const DiagnosticErrorPtr& error, Add&& add) {
   for (DiagnosticErrorPtr one = error; one != nullptr; one = one->underlyingError()) {
@@ -120,8 +120,8 @@ void addBound(Json& limit, const char* key, const std::shared_ptr<const QZBound>
   limit[key] = std::move(json);
 }
 
-// Validators compare numbers and know no units. A limit that a result cannot be judged by, and one without a bound,
-// stand in the metadata.
+// Validators compare plain numbers, without units. A limit without a bound, or one that cannot judge the result, goes
+// to the metadata instead.
 Json resultJson(const JudgedResult& judged) {
   const QZMeasuredResult& result = judged.result;
   Json json = measurementJson(result.name(), result.measurement());
@@ -142,7 +142,7 @@ Json resultJson(const JudgedResult& judged) {
   return json;
 }
 
-// With an error nobody knows what the hardware is like: a diagnosis FAIL would say so, and make the run fail.
+// After an error the state of the hardware is unknown: a diagnosis FAIL would claim a fault and make the run fail.
 Json diagnosisJson(const JudgedResult& judged, bool known) {
   const bool passed = judged.verdict == ResultVerdict::kPass;
   const char* const type = !known ? "UNKNOWN" : passed ? "PASS" : "FAIL";
@@ -160,7 +160,7 @@ class RecordWriter {
   RecordWriter(std::string& out, const RunStarted& run, const DiagnosticRecord& record)
       : run_(run), record_(record), stream_(out, record.log, record.begin) {}
 
-  // Gives the date of the last line.
+  // Returns the date of the last line.
   Date write() {
     Json metadata = Json::object();
     addText(metadata, "summary", record_.summary);
@@ -183,7 +183,7 @@ class RecordWriter {
   }
 
  private:
-  // The stages of a step that took place: by their beginning and end.
+  // The stages of a step that took place, with their dates.
   template <class IsOfStep>
   std::vector<StagePeriod> stagesThat(IsOfStep&& isOfStep) const {
     std::vector<StagePeriod> stages;
@@ -255,7 +255,7 @@ class RecordWriter {
       if (one.verdict == ResultVerdict::kNone) continue;
       stream_.addToStep(kAnalysisStep, "diagnosis", diagnosisJson(one, known), stepEnd_);
     }
-    // The judge's error is this step's too. An analysis whose error came after another one has left no result.
+    // An error of the judge belongs to this step. If an earlier stage failed, the analysis has no result.
     const bool hasError = !known && !errorIsWritten_ && record_.errorStage.value_or(Stage::kAnalyze) == Stage::kAnalyze;
     endStep(kAnalysisStep, hasError, !known && record_.measuredResults.empty());
   }

@@ -49,7 +49,7 @@ DiagnosticRecord fullRecord(Verdict verdict) {
   return record;
 }
 
-// An artifact: its step, or "run", and itself.
+// An artifact and the name of its step, or "run".
 struct Artifact {
   std::string step;
   std::string key;
@@ -81,14 +81,14 @@ std::vector<Artifact> artifactsOf(const DiagnosticRecord& record) {
   return artifactsOf(ocpReport(startedRun(), {record}, std::nullopt));
 }
 
-// "step key" of each artifact.
+// "STEP KEY" for each artifact.
 std::vector<std::string> outlineOf(const std::vector<Artifact>& artifacts) {
   std::vector<std::string> outline;
   for (const Artifact& one : artifacts) outline.push_back((one.step.empty() ? "" : one.step + " ") + one.key);
   return outline;
 }
 
-// The contents of one key.
+// The contents of all artifacts with that key.
 std::vector<Json> allOf(const std::vector<Artifact>& artifacts, const std::string& key, const std::string& step = {}) {
   std::vector<Json> found;
   for (const Artifact& one : artifacts) {
@@ -110,7 +110,7 @@ std::shared_ptr<const QZBound> boundOf(double value, bool open, const QZUnit& un
   return std::make_shared<const QZBound>(Measurement(value, unit), open);
 }
 
-// The artifact of a record's one measured result.
+// The artifact of the only measured result of a record.
 Json measurementOf(const QZMeasuredResult& result) {
   DiagnosticRecord record = fullRecord(Verdict::kError);
   record.measuredResults = {judgeResult(result)};
@@ -280,8 +280,8 @@ TEST(OcpReport, EndsAsTheVerdictSays) {
 struct ErrorRow {
   const char* name;
   std::optional<Stage> stage;
-  const char* step;        // of the error
-  const char* experiment;  // the step's status; empty for no step
+  const char* step;        // in which the error occurs
+  const char* experiment;  // the status of the experiment's step; empty if there is no such step
   const char* analysis;
 };
 

@@ -29,7 +29,7 @@ OcpStream::OcpStream(std::string& out, const std::vector<LogLine>& log, Date beg
 }
 
 void OcpStream::addToRun(const char* key, Json artifact, Date date) {
-  // The start of the run stands before its log, even before lines that are older.
+  // Log lines follow the start of the run even if they are older.
   if (number_ > 1) writeLogUntil(date);
   write("testRunArtifact", {{key, std::move(artifact)}}, date);
 }

@@ -35,7 +35,7 @@ TEST(OcpStream, NumbersAndDatesItsLines) {
 )");
 }
 
-// The texts of log lines and the keys of artifacts, in the order of their lines.
+// The texts of log lines and the keys of artifacts, in the order of the output.
 std::vector<std::string> orderOf(const std::string& out) {
   std::vector<std::string> order;
   std::istringstream lines(out);

@@ -16,7 +16,7 @@ using SteadyClock = std::chrono::steady_clock;
 constexpr std::chrono::milliseconds kQuietTime = 300ms;
 constexpr std::chrono::milliseconds kPeriod = 100ms;
 
-// With at most one digit after the point.
+// Rounded to one decimal.
 std::string secondsText(double seconds) { return defaultText(std::round(seconds * 10) / 10) + " s"; }
 
 }  // namespace
@@ -75,7 +75,7 @@ void Progress::stop() {
   erase();
 }
 
-void Progress::aside(const std::function<void()>& write) {
+void Progress::printAbove(const std::function<void()>& write) {
   erase();
   write();
 }

@@ -45,7 +45,7 @@ class Progress {
   // Erases the line. Does nothing if nothing is running.
   void stop();
   // Erases the line and calls `write`, which may write to the terminal. The next update shows the line again.
-  void aside(const std::function<void()>& write);
+  void printAbove(const std::function<void()>& write);
 
  private:
   void erase();

@@ -72,7 +72,7 @@ TEST(Progress, ShowsNothingWithoutATerminal) {
   Progress progress(nullptr);
   progress.start("Name", {3.0, std::nullopt});
   bool called = false;
-  progress.aside([&called] { called = true; });
+  progress.printAbove([&called] { called = true; });
   progress.stop();
   EXPECT_TRUE(called);
 }
@@ -95,7 +95,7 @@ TEST(Progress, KeepsTheCounterOfFramesNoLongerThanTheRun) {
   const auto watched = std::make_shared<int>(0);
   const auto count = [watched] { return std::uint64_t{7}; };
   progress.countFrames(count);
-  EXPECT_EQ(watched.use_count(), 2);  // nothing runs: only `count` has it
+  EXPECT_EQ(watched.use_count(), 2);  // nothing is running, so only `count` holds it
   progress.start("Name", {});
   progress.countFrames(count);
   EXPECT_EQ(watched.use_count(), 3);
@@ -110,7 +110,7 @@ TEST(Progress, ShowsALongRunAndErasesItsLine) {
   progress.countFrames([] { return std::uint64_t{7}; });
   while (terminal.str().empty()) progress.update();
   EXPECT_EQ(terminal.str(), "Running Name: 0.3 s");
-  progress.aside([&terminal] { terminal << "|"; });
+  progress.printAbove([&terminal] { terminal << "|"; });
   progress.stop();
   EXPECT_EQ(terminal.str(), "Running Name: 0.3 s\r\033[K|");
 }

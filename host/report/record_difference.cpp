@@ -11,7 +11,7 @@ namespace quazor {
 
 namespace {
 
-// What is compared, by what it is called, as text for people.
+// The facts to compare: user-readable text by user-readable name.
 using Facts = OrderedMap<std::string>;
 
 std::string measurementText(const Measurement& measurement) {
@@ -25,7 +25,7 @@ std::string oneLine(const DiagnosticErrorPtr& error) {
   return text;
 }
 
-// Of several of one name each has its number.
+// Numbers facts of the same name.
 void setFact(Facts& facts, const std::string& name, std::string fact) {
   std::string unique = name;
   for (std::size_t number = 2; facts.contains(unique); ++number) unique = formatMessage("%@ (%@)", name, number);
@@ -36,9 +36,9 @@ Facts factsOf(const DiagnosticRecord& record) {
   Facts facts;
   facts.set("verdict", std::string(nameOf(record.verdict)));
   facts.set("error", oneLine(record.error));
-  for (const Part half : {Part::kExperiment, Part::kAnalysis}) {
-    for (const ResolvedParameter& one : record.parameters.of(half)) {
-      setFact(facts, formatMessage("parameter %@.%@", nameOf(half), one.name),
+  for (const Part part : {Part::kExperiment, Part::kAnalysis}) {
+    for (const ResolvedParameter& one : record.parameters.of(part)) {
+      setFact(facts, formatMessage("parameter %@.%@", nameOf(part), one.name),
               one.value ? defaultText(*one.value) : "not set");
     }
   }

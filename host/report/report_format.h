@@ -26,7 +26,7 @@ struct OutputRequest {
   std::filesystem::path file;
 };
 
-// [FORMAT:]FILE; without a format it is `usual`. Throws a CommandError (kUsage) for a word before a colon that is no
+// [FORMAT:]FILE; the default format is `usual`. Throws a CommandError (kUsage) if the word before a colon is not a
 // format.
 OutputRequest parseOutput(const std::string& text, Format usual);
 

@@ -20,7 +20,7 @@ void RunReport::onEvent(const RunEvent& event) {
   } else if (const auto* const logged = std::get_if<Logged>(&event)) {
     const LogLine& line = logged->line;
     if (line.level > options_.shownLog) return;
-    progress_.aside([&] {
+    progress_.printAbove([&] {
       console_.err << readableLogLine(line.date, line.level, sharedLog().category(), printableLines(line.text))
                    << std::flush;
     });
@@ -37,7 +37,7 @@ void RunReport::addRecord(DiagnosticRecord record) {
     printReport(console_.out, record, console_.colour, console_.blocks);
   }
   console_.out.flush();
-  // A table of measurements has no place for errors.
+  // The CSV table of measurements has no column for errors.
   if (options_.format == Format::kCsv && run_.ofExperiments && record.error != nullptr) {
     console_.err << "quazor: " << printable(record.name) << " ended in an error\n" << errorText(record.error, "  ");
   }

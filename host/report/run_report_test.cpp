@@ -20,7 +20,7 @@ using Json = nlohmann::ordered_json;
 
 class RunReportTest : public testing::Test {
  protected:
-  // The record of a diagnostic, or of an experiment, of that verdict, without log lines.
+  // A record of a diagnostic or experiment with that verdict and without log lines.
   DiagnosticRecord quietRecord(const std::string& name, Verdict verdict) const {
     DiagnosticRecord record = recordOf(name, verdict);
     record.log.clear();

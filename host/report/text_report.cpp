@@ -87,7 +87,7 @@ std::string count(std::size_t number, std::string_view what) {
   return std::to_string(number) + " " + std::string(what);
 }
 
-// What stands below the name in a description.
+// The lines below the name in a description.
 std::string headline(const Diagnostic& diagnostic) {
   if (!diagnostic.experimentOnly) return diagnostic.summary;
   if (diagnostic.usedBy.empty()) return "An experiment. No diagnostic uses it.";
@@ -101,7 +101,7 @@ std::string headline(const Diagnostic& diagnostic) {
   return text + ".";
 }
 
-// What stands beside an experiment's name in a list.
+// The text next to the name of an experiment in a list.
 std::string listedSummary(const DescribedDiagnostic& one) {
   const DiagnosticErrorPtr& error = one.description.error;
   if (error != nullptr) return "could not be described: " + printable(error->localizedDescription());

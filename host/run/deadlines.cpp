@@ -14,7 +14,7 @@ namespace quazor {
 namespace {
 
 constexpr std::chrono::minutes kDefault{1};
-// What a clock's moments can be added to without an overflow.
+// Adding this to a time point does not overflow.
 constexpr std::chrono::hours kMaxLength{24 * 365};
 
 }  // namespace
@@ -49,7 +49,7 @@ Deadlines::Deadlines(const ResolvedParameters& parameters, const std::vector<Dea
     times_[static_cast<std::size_t>(Stage::kRun)] =
         kDefault + nanosecondsFromSeconds(std::isfinite(*seconds) ? std::min(2 * *seconds, longest) : longest);
   }
-  // What is said of one stage counts more than what is said of all.
+  // A setting for one stage takes precedence over a setting for all.
   for (const DeadlineSetting& one : settings) {
     if (!one.stage) times_.fill(one.time);
   }

@@ -18,11 +18,11 @@ namespace quazor {
 
 namespace {
 
-// So many measurements or results go into one event that the events' own cost does not count, and so few that a reader
-// of them never waits for long.
+// The number of measurements or results per event: large enough to make the overhead negligible, small enough to keep a
+// reader from waiting.
 constexpr std::size_t kChunk = 500;
 
-// Lets one event through at a time.
+// Serializes events from several threads.
 class OneAtATime final : public RunEventSink {
  public:
   explicit OneAtATime(RunEventSink& events) : events_(events) {}
@@ -37,7 +37,7 @@ class OneAtATime final : public RunEventSink {
   RunEventSink& events_;
 };
 
-// The log of a run goes to its events as long as this lives.
+// Sends the log lines of a run as events during its lifetime.
 class LogOfRun {
  public:
   LogOfRun(std::shared_ptr<const Clock> clock, LogLevel level, RunEventSink& events)
@@ -56,13 +56,13 @@ class LogOfRun {
   const LogLevel level_;
 };
 
-// One run's state between its stages.
+// The state of one run between its stages.
 class Run {
  public:
   Run(const Diagnostic& diagnostic, const ResolvedParameters& parameters, const Clock& clock, RunEventSink& events)
       : diagnostic_(diagnostic), parameters_(parameters), clock_(clock), events_(events) {}
 
-  // The experiment's result, or null.
+  // Returns the experiment's result, or null.
   std::unique_ptr<QZExperimentResult> experiment() {
     const std::string& name = diagnostic_.experimentName;
     std::shared_ptr<QZExperiment> experiment;
@@ -138,7 +138,7 @@ class Run {
     return false;
   }
 
-  // Makes an experiment or analysis by its factory, and asks its description as every host does.
+  // Creates an experiment or analysis and asks for its description, like every host.
   template <class Made, class Describe>
   std::shared_ptr<Made> make(const std::string& name, const std::function<std::shared_ptr<Made>()>& factory,
                              Describe&& describe) {
@@ -215,7 +215,7 @@ void analyzeResult(const Diagnostic& diagnostic, const ResolvedParameters& param
     const LogOfRun log(platform.clock, logLevel, serial);
     installPlatform(platform);
     Run run(diagnostic, parameters, *platform.clock, serial);
-    run.tell(result);  // so that what the analysis makes of it can be analyzed again
+    run.tell(result);  // makes it possible to analyze the new record again
     run.analyze(result);
   }
   events.onEvent(DiagnosticCompleted{});

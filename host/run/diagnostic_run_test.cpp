@@ -55,7 +55,7 @@ class DiagnosticRunTest : public testing::Test {
     return resolveParameters(diagnostic_, {}, settings);
   }
 
-  // What the events come to when the host closes them.
+  // The record that the host builds from the events.
   DiagnosticRecord recordOfEvents() const {
     RecordBuilder builder;
     for (const RunEvent& event : events_.events) builder.onEvent(event);
@@ -242,12 +242,12 @@ TEST_F(DiagnosticRunTest, MakesAPhoneForEveryRun) {
   EXPECT_EQ(phonesMade_, 2);
 }
 
-// What happens in a run with each behaviour: its error, and which stages took place.
+// A behaviour, its error, and the stages that take place.
 struct FailureRow {
   const char* name;
   Behaviour behaviour;
   const char* error;
-  const char* stages;  // setup, run, teardown, analysis: a letter each for what took place
+  const char* stages;  // one letter per stage that took place: setup, run, teardown, analysis
   std::size_t results;
 };
 
@@ -364,7 +364,7 @@ TEST_F(DiagnosticRunTest, MakesANewExperimentOnThePhonesPlatform) {
   EXPECT_NE(installedPlatform().clock.get(), clockOfRun);
 }
 
-// Gives so many measurements, and so many results of them.
+// Produces that many measurements and that many results.
 class LargeDiagnosticTest : public DiagnosticRunTest {
  protected:
   class LargeExperiment final : public fake::FakeExperiment {

@@ -14,7 +14,7 @@ namespace {
 
 constexpr std::chrono::seconds kMaxWaitOfInterrupt{1};
 
-// The record of the last run, or null where there is no place for it: it is kept unasked, so nothing depends on it.
+// The record of the previous run; null if it cannot be created. The user did not request it, so that is no failure.
 std::unique_ptr<RecordWriter> lastRunRecord() {
   const std::filesystem::path file = previousRunFile();
   if (file.empty()) return nullptr;
@@ -45,7 +45,7 @@ void EventPipeline::onEvent(const RunEvent& event) {
 
 void EventPipeline::pass(const RunEvent& event) {
   if (!records_.empty()) {
-    // A million log lines are made into text once, not once for each record.
+    // Formats the line once for all records: a run may have a million log lines.
     const std::string line = recordLine(event, recorded_++);
     for (const std::unique_ptr<RecordWriter>& record : records_) record->onEvent(event, line);
   }

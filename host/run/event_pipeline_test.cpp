@@ -31,7 +31,7 @@ class EventPipelineTest : public testing::Test {
     for (const RunEvent& event : some) events.onEvent(event);
   }
 
-  // A diagnostic's events as its process tells them, and its end.
+  // The events that the process of a diagnostic sends, and the end of the diagnostic.
   static void perform(EventPipeline& events, const std::string& name, double value) {
     takeAll(events, wholeDiagnostic(name, value));
     events.endDiagnostic();
@@ -69,7 +69,7 @@ TEST_F(EventPipelineTest, RecordsAndReportsARun) {
 }
 
 TEST_F(EventPipelineTest, RecordsWhatTheUserIsToldBeforehand) {
-  // Whatever is on the console when something is written to it, the record has it already.
+  // At each flush of the console, checks that the record already contains what the console shows.
   class Watcher final : public std::stringbuf {
    public:
     explicit Watcher(fs::path record) : record_(std::move(record)) {}
@@ -82,7 +82,7 @@ TEST_F(EventPipelineTest, RecordsWhatTheUserIsToldBeforehand) {
       return 0;
     }
 
-    std::optional<bool> isRecorded;  // when it was seen for the first time
+    std::optional<bool> isRecorded;  // set when the verdict first appears on the console
 
    private:
     const fs::path record_;
@@ -156,7 +156,7 @@ TEST_F(EventPipelineTest, ClosesTheOpenDiagnosticAndTheRunWhenInterrupted) {
   bool left = false;
   events.interruptAndLeave([&] {
     left = true;
-    EXPECT_TRUE(runIn(record_).ended);  // all is written by then
+    EXPECT_TRUE(runIn(record_).ended);  // everything is written by then
   });
   EXPECT_TRUE(left);
   const RecordedRun run = runIn(record_);
@@ -219,7 +219,7 @@ TEST_F(EventPipelineTest, LetsOneEventThroughAtATime) {
 }
 
 TEST_F(EventPipelineTest, SendsLogLinesToTheSystemsLogWhenAskedTo) {
-  // It cannot be seen from here what the system makes of them: that nothing else changes is what can.
+  // A test cannot read the system log, so it only checks that nothing else changes.
   options_.systemLog = true;
   EventPipeline events(options_, console_);
   events.onEvent(runOf({"A"}));

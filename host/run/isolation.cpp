@@ -32,19 +32,19 @@ using Moment = Supervision::Moment;
 using SteadyClock = std::chrono::steady_clock;
 using namespace std::chrono_literals;
 
-// The exit code of a child that found its connection gone.
+// The exit code of a child whose connection was closed.
 constexpr int kNoConnection = 113;
-// Of what a plug-in writes to its standard output, so many lines are kept, and so many octets.
+// Limits, in lines and bytes, on the standard output of a plug-in that becomes log lines.
 constexpr std::size_t kMaxOutputLines = 10'000;
 constexpr std::size_t kMaxOutput = 4'000'000;
 
-// The child's end of the connection: a line for each thing that it says.
+// The child's end of the connection, which carries one JSON document per line.
 class Connection {
  public:
   explicit Connection(int descriptor) : descriptor_(descriptor), owner_(::getpid()) {}
 
   void say(const Json& json) const {
-    if (::getpid() != owner_) ::_exit(EXIT_FAILURE);  // a copy of the process, which the plug-in made
+    if (::getpid() != owner_) ::_exit(EXIT_FAILURE);  // a copy of the process, made by the plug-in
     const std::string line = json.dump(-1, ' ', false, Json::error_handler_t::replace) + "\n";
     std::string_view left = line;
     while (!left.empty()) {
@@ -73,7 +73,7 @@ std::string secondsText(std::chrono::nanoseconds time) {
   return defaultText(std::chrono::duration<double>(time).count()) + " s";
 }
 
-// Why a process ended before its time. `during` is what it was doing.
+// The error for a process that ended early while it was doing `during`.
 DiagnosticErrorPtr errorOf(const Supervised& supervised, const std::string& during, std::chrono::nanoseconds deadline) {
   const std::string stuck = supervised.end ? std::string() : "; its process could not be killed";
   switch (supervised.how) {
@@ -99,7 +99,7 @@ DiagnosticErrorPtr errorOf(const Supervised& supervised, const std::string& duri
                    during + " closed or overwrote its process's connection to quazor" + stuck);
 }
 
-// The files that register the diagnostic and its halves.
+// The files that register the diagnostic, its experiment and its analysis.
 std::vector<std::filesystem::path> pluginsOf(const Diagnostic& one, const std::vector<LoadedPlugin>& loaded) {
   const auto isPart = [&one](const QZLab::Registration& registration) {
     switch (registration.kind) {
@@ -120,19 +120,19 @@ std::vector<std::filesystem::path> pluginsOf(const Diagnostic& one, const std::v
   return files;
 }
 
-// One attempt at a survey: what a process says until it ends.
-class SurveyAttempt {
+// One attempt at a scan: collects the messages of a process until it ends.
+class ScanAttempt {
  public:
-  SurveyAttempt(const IsolationOptions& options, const std::vector<std::filesystem::path>& plugins, PluginScan& survey,
-                const DiagnosticChoice& described)
+  ScanAttempt(const IsolationOptions& options, const std::vector<std::filesystem::path>& plugins, PluginScan& scan,
+              const DiagnosticChoice& described)
       : deadlines_({}, options.deadlines),
         memory_(options.memory),
         plugins_(plugins),
-        survey_(survey),
+        scan_(scan),
         described_(described),
-        known_(survey.catalogue.size()) {}
+        known_(scan.catalogue.size()) {}
 
-  // True when the survey is complete.
+  // Returns true if the scan is complete.
   bool perform(WatchedSignals& signals) {
     beginStage(Stage::kLoad);
     Supervised end;
@@ -141,23 +141,23 @@ class SurveyAttempt {
           signals, [this](int descriptor) { speak(Connection(descriptor)); }, memory_, isCleanupProcess);
       Supervision supervision;
       supervision.takeLine = [this](std::string_view line) { return take(line); };
-      supervision.takeOutput = [](std::string_view /*line*/) {};  // there is no run whose log it could go to
+      supervision.takeOutput = [](std::string_view /*line*/) {};  // there is no run log to write to
       supervision.deadline = [this] { return deadline_; };
       supervision.isDone = [this] { return done_; };
       end = supervise(child, signals, supervision);
     }
     if (refusal_) throw CommandError(*refusal_);
     if (done_) return true;
-    if (end.how == SupervisionEnd::kInterrupted) survey_.interrupted = true;
+    if (end.how == SupervisionEnd::kInterrupted) scan_.interrupted = true;
     blame(end);
-    return survey_.interrupted;
+    return scan_.interrupted;
   }
 
-  // What failed while it was loaded.
+  // The plug-in whose loading failed.
   const std::optional<std::filesystem::path>& failedPlugin() const { return failedPlugin_; }
 
  private:
-  // In the child.
+  // Runs in the child.
   void speak(const Connection& connection) const {
     try {
       const std::vector<LoadedPlugin> loaded = loadPlugins(plugins_, [&connection](const std::filesystem::path& file) {
@@ -211,8 +211,8 @@ class SurveyAttempt {
   }
 
   void describe(DiagnosticDescription description) {
-    if (survey_.catalogue.size() >= catalogue_.size()) throw InputError("there are more descriptions than diagnostics");
-    survey_.catalogue.push_back({catalogue_[survey_.catalogue.size()], std::move(description)});
+    if (scan_.catalogue.size() >= catalogue_.size()) throw InputError("there are more descriptions than diagnostics");
+    scan_.catalogue.push_back({catalogue_[scan_.catalogue.size()], std::move(description)});
   }
 
   void beginStage(Stage stage) {
@@ -220,24 +220,25 @@ class SurveyAttempt {
     deadline_ = SteadyClock::now() + deadlines_.of(stage);
   }
 
-  // Blames the plug-in that was being loaded, or else what was being described, for the end of the process.
+  // Attributes the end of the process to the plug-in that was being loaded, or to the diagnostic that was being
+  // described.
   void blame(const Supervised& end) {
     const std::chrono::nanoseconds deadline = deadlines_.of(stage_);
-    if (survey_.catalogue.size() < catalogue_.size()) {
+    if (scan_.catalogue.size() < catalogue_.size()) {
       DiagnosticDescription description;
-      description.error = errorOf(end, "describing " + catalogue_[survey_.catalogue.size()].name, deadline);
+      description.error = errorOf(end, "describing " + catalogue_[scan_.catalogue.size()].name, deadline);
       describe(std::move(description));
       return;
     }
     const std::filesystem::path file = loading_ ? std::filesystem::path(*loading_) : plugins_.back();
     failedPlugin_ = file;
-    survey_.failed.push_back({file, errorOf(end, "loading the plug-in '" + file.string() + "'", deadline)});
+    scan_.failed.push_back({file, errorOf(end, "loading the plug-in '" + file.string() + "'", deadline)});
   }
 
   const Deadlines deadlines_;
   const std::optional<std::uint64_t> memory_;
   const std::vector<std::filesystem::path>& plugins_;
-  PluginScan& survey_;
+  PluginScan& scan_;
   const DiagnosticChoice& described_;
   const std::size_t known_;
   std::vector<Diagnostic> catalogue_;
@@ -249,7 +250,7 @@ class SurveyAttempt {
   bool done_ = false;
 };
 
-// One run in a process of its own, seen from outside.
+// The parent's side of one run in a separate process.
 class IsolatedRun {
  public:
   IsolatedRun(const Diagnostic& diagnostic, const Deadlines& deadlines, Progress& progress, RunEventSink& events)
@@ -285,7 +286,8 @@ class IsolatedRun {
     if (!event || completed_ || isOfHost(*event)) return false;
     if (const auto* const began = std::get_if<StageStarted>(&*event)) beginStage(began->stage);
     if (const auto* const logged = std::get_if<Logged>(&*event)) time_ = logged->line.time;
-    // What comes between two stages may be much, but it comes; log lines may come for ever.
+    // Each event between two stages extends the deadline, because their number is finite. Log lines do not: they may
+    // never end.
     if (std::holds_alternative<StageEnded>(*event)) between_ = true;
     if (between_ && !std::holds_alternative<Logged>(*event)) deadline_ = SteadyClock::now() + deadlines_.of(stage_);
     completed_ = std::holds_alternative<DiagnosticCompleted>(*event);
@@ -325,15 +327,15 @@ class IsolatedRun {
   RunEventSink& events_;
   Stage stage_ = Stage::kLoad;
   Moment deadline_;
-  std::chrono::nanoseconds time_{};  // of the last log line
-  std::size_t outputLines_ = 0;      // that are kept
-  std::size_t output_ = 0;           // octets of them
+  std::chrono::nanoseconds time_{};  // time of the last log line
+  std::size_t outputLines_ = 0;      // lines kept
+  std::size_t output_ = 0;           // bytes kept
   std::size_t droppedLines_ = 0;
   bool between_ = false;
   bool completed_ = false;
 };
 
-// Those of the plug-ins that the diagnostic needs: another one that ends its process would end this one's.
+// The plug-ins that the diagnostic needs. Any other plug-in could end the process.
 std::vector<std::filesystem::path> pluginsFor(const Diagnostic& diagnostic,
                                               std::vector<std::filesystem::path> plugins) {
   if (diagnostic.plugins.empty()) return plugins;
@@ -343,7 +345,7 @@ std::vector<std::filesystem::path> pluginsFor(const Diagnostic& diagnostic,
   return plugins;
 }
 
-// In the child: the catalogue's own diagnostic, with its factories; nothing, and a failure, when there is none.
+// Runs in the child: returns the registered diagnostic with its factories, or nothing after reporting a failure.
 std::optional<Diagnostic> loadDiagnostic(const IsolationOptions& options, const Diagnostic& wanted,
                                          RunEventSink& events) {
   std::optional<Diagnostic> found;
@@ -362,7 +364,7 @@ std::optional<Diagnostic> loadDiagnostic(const IsolationOptions& options, const 
   return found;
 }
 
-// Copies the number of a phone's frames to where the watching process sees it, while the phone lives.
+// Copies the phone's frame count to shared memory for as long as the phone exists.
 void countFrames(const std::weak_ptr<const Phone>& phone, SharedCounter& counter) {
   std::thread([phone, &counter] {
     while (const std::shared_ptr<const Phone> one = phone.lock()) {
@@ -380,17 +382,17 @@ IsolationOptions withoutFailed(IsolationOptions options, const std::vector<Faile
 }
 
 PluginScan scanPlugins(const IsolationOptions& options, WatchedSignals& signals, const DiagnosticChoice& described) {
-  PluginScan survey;
+  PluginScan scan;
   std::vector<std::filesystem::path> plugins = options.plugins;
   while (!plugins.empty()) {
-    SurveyAttempt attempt(options, plugins, survey, described);
+    ScanAttempt attempt(options, plugins, scan, described);
     if (attempt.perform(signals)) break;
     if (!attempt.failedPlugin()) continue;
-    survey.catalogue.clear();  // an earlier attempt may have found what that plug-in registers
-    // What is not among the plug-ins that were named is a plug-in's own invention.
+    scan.catalogue.clear();  // an earlier attempt may have found the diagnostics of that plug-in
+    // If the child reports a plug-in that was not in the list, its messages cannot be trusted.
     if (std::erase(plugins, *attempt.failedPlugin()) == 0) plugins.clear();
   }
-  return survey;
+  return scan;
 }
 
 bool runIsolated(const IsolationOptions& options, WatchedSignals& signals, const Diagnostic& diagnostic,

@@ -21,7 +21,7 @@ namespace quazor {
 
 struct IsolationOptions {
   std::vector<std::filesystem::path> plugins;
-  std::optional<std::uint64_t> memory;  // the most address space of a process, in bytes; nothing: as the system has it
+  std::optional<std::uint64_t> memory;  // limit of a process's address space in bytes; nothing: the system's limit
   std::vector<DeadlineSetting> deadlines;
 };
 

@@ -40,14 +40,14 @@ std::vector<Diagnostic> everything(const std::vector<Diagnostic>& catalogue) { r
 
 class IsolationTest : public testing::Test {
  protected:
-  PluginScan survey(const std::vector<std::string>& plugins) {
+  PluginScan scan(const std::vector<std::string>& plugins) {
     for (const std::string& name : plugins) options_.plugins.push_back(plugin(name));
     return scanPlugins(options_, signals_, everything);
   }
 
-  static std::vector<std::string> namesIn(const PluginScan& survey) {
+  static std::vector<std::string> namesIn(const PluginScan& scan) {
     std::vector<std::string> names;
-    for (const DescribedDiagnostic& one : survey.catalogue) names.push_back(one.diagnostic.name);
+    for (const DescribedDiagnostic& one : scan.catalogue) names.push_back(one.diagnostic.name);
     return names;
   }
 
@@ -56,11 +56,11 @@ class IsolationTest : public testing::Test {
   IsolationOptions options_;
 };
 
-using SurveyTest = IsolationTest;
+using ScanTest = IsolationTest;
 
-TEST_F(SurveyTest, TellsWhatThePluginsHaveWithoutLoadingThemHere) {
+TEST_F(ScanTest, TellsWhatThePluginsHaveWithoutLoadingThemHere) {
   const std::size_t before = QZLab::defaultLab().registrations().size();
-  const PluginScan all = survey({"working", "experiments"});
+  const PluginScan all = scan({"working", "experiments"});
   EXPECT_EQ(QZLab::defaultLab().registrations().size(), before);
   EXPECT_THAT(all.failed, IsEmpty());
   EXPECT_FALSE(all.interrupted);
@@ -79,7 +79,7 @@ TEST_F(SurveyTest, TellsWhatThePluginsHaveWithoutLoadingThemHere) {
   EXPECT_THAT(all.catalogue[5].diagnostic.usedBy, ElementsAre("Fake.One", "Fake.Two"));
 }
 
-TEST_F(SurveyTest, AsksOnlyForTheDescriptionsThatAreWanted) {
+TEST_F(ScanTest, AsksOnlyForTheDescriptionsThatAreWanted) {
   options_.plugins = {plugin("working")};
   const PluginScan some = scanPlugins(options_, signals_, [](const std::vector<Diagnostic>& catalogue) {
     return std::vector<Diagnostic>{catalogue[1]};
@@ -91,7 +91,7 @@ TEST_F(SurveyTest, AsksOnlyForTheDescriptionsThatAreWanted) {
   for (std::size_t i = 0; i < some.catalogue.size(); ++i) EXPECT_EQ(some.catalogue[i].description.isAsked, i == 1) << i;
 }
 
-TEST_F(SurveyTest, ThrowsTheRefusalsOfTheChoice) {
+TEST_F(ScanTest, ThrowsTheRefusalsOfTheChoice) {
   options_.plugins = {plugin("working")};
   const auto refuse = [](const std::vector<Diagnostic>&) -> std::vector<Diagnostic> {
     throw CommandError(ExitCode::kUsage, "not that");
@@ -99,8 +99,8 @@ TEST_F(SurveyTest, ThrowsTheRefusalsOfTheChoice) {
   EXPECT_THROW(scanPlugins(options_, signals_, refuse), CommandError);
 }
 
-TEST_F(SurveyTest, TellsWhichPluginsADiagnosticNeeds) {
-  const PluginScan all = survey({"working", "combining", "experiments"});
+TEST_F(ScanTest, TellsWhichPluginsADiagnosticNeeds) {
+  const PluginScan all = scan({"working", "combining", "experiments"});
   const auto pluginsOf = [&all](const std::string& name) {
     for (const DescribedDiagnostic& one : all.catalogue) {
       if (one.diagnostic.name == name) return one.diagnostic.plugins;
@@ -114,9 +114,9 @@ TEST_F(SurveyTest, TellsWhichPluginsADiagnosticNeeds) {
   EXPECT_THAT(pluginsOf("Alone.Images"), ElementsAre(plugin("experiments")));
 }
 
-TEST_F(SurveyTest, ThrowsTheRefusalsOfTheLoader) {
+TEST_F(ScanTest, ThrowsTheRefusalsOfTheLoader) {
   try {
-    survey({"working", "empty"});
+    scan({"working", "empty"});
     ADD_FAILURE() << "it was accepted";
   } catch (const CommandError& refusal) {
     EXPECT_EQ(refusal.code(), ExitCode::kCannotRead);
@@ -124,8 +124,8 @@ TEST_F(SurveyTest, ThrowsTheRefusalsOfTheLoader) {
   }
 }
 
-TEST_F(SurveyTest, LeavesOutAPluginThatEndsItsProcessWhileItIsLoaded) {
-  const PluginScan rest = survey({"experiments", "fatal", "analysis"});
+TEST_F(ScanTest, LeavesOutAPluginThatEndsItsProcessWhileItIsLoaded) {
+  const PluginScan rest = scan({"experiments", "fatal", "analysis"});
   EXPECT_THAT(namesIn(rest), ElementsAre("Alone.Images", "Alone.Counts", "Alone.Nothing"));
   ASSERT_EQ(rest.failed.size(), 1U);
   EXPECT_EQ(rest.failed[0].file, plugin("fatal"));
@@ -133,23 +133,23 @@ TEST_F(SurveyTest, LeavesOutAPluginThatEndsItsProcessWhileItIsLoaded) {
                                               "' crashed: its process was terminated by signal 6 (SIGABRT)");
 }
 
-TEST_F(SurveyTest, IsEmptyWhenNoPluginCanBeLoaded) {
-  const PluginScan none = survey({"fatal"});
+TEST_F(ScanTest, IsEmptyWhenNoPluginCanBeLoaded) {
+  const PluginScan none = scan({"fatal"});
   EXPECT_THAT(none.catalogue, IsEmpty());
   EXPECT_EQ(none.failed.size(), 1U);
 }
 
-TEST_F(SurveyTest, EndsALoadingThatTakesTooLong) {
+TEST_F(ScanTest, EndsALoadingThatTakesTooLong) {
   options_.deadlines = {{Stage::kLoad, 50ms}};
   const EnvironmentVariable way("FATAL_PLUGIN", "hang");
-  const PluginScan none = survey({"fatal"});
+  const PluginScan none = scan({"fatal"});
   ASSERT_EQ(none.failed.size(), 1U);
   EXPECT_THAT(textOf(none.failed[0].error),
               testing::AllOf(testing::StartsWith("QuazorHostErrorDomain 8 loading the plug-in '"),
                              testing::EndsWith("exceeded its deadline of 0.05 s")));
 }
 
-TEST_F(SurveyTest, LeavesOutAPluginThatWritesToItsProcessConnection) {
+TEST_F(ScanTest, LeavesOutAPluginThatWritesToItsProcessConnection) {
   constexpr const char* kDescribed =
       R"(={"says":"described","description":{"experiment":{"summary":"","parameters":[]},)"
       R"("analysis":{"summary":"","parameters":[]},"error":null,"isAsked":true}})";
@@ -169,8 +169,8 @@ TEST_F(SurveyTest, LeavesOutAPluginThatWritesToItsProcessConnection) {
   }
 }
 
-TEST_F(SurveyTest, GoesOnBehindWhatEndsItsProcessWhileItIsDescribed) {
-  const PluginScan all = survey({"undescribable", "unruly"});
+TEST_F(ScanTest, GoesOnBehindWhatEndsItsProcessWhileItIsDescribed) {
+  const PluginScan all = scan({"undescribable", "unruly"});
   EXPECT_THAT(all.failed, IsEmpty());
   ASSERT_THAT(namesIn(all), ElementsAre("Fatal", "Unruly", "FatalExperiment", "UnrulyExperiment"));
   EXPECT_EQ(textOf(all.catalogue[0].description.error),
@@ -182,10 +182,10 @@ TEST_F(SurveyTest, GoesOnBehindWhatEndsItsProcessWhileItIsDescribed) {
   EXPECT_EQ(all.catalogue[3].description.error, nullptr);
 }
 
-TEST_F(SurveyTest, EndsWhenTheUserInterruptsIt) {
+TEST_F(ScanTest, EndsWhenTheUserInterruptsIt) {
   const EnvironmentVariable way("FATAL_PLUGIN", "hang");
   ASSERT_EQ(::kill(::getpid(), SIGINT), 0);
-  const PluginScan none = survey({"fatal", "working"});
+  const PluginScan none = scan({"fatal", "working"});
   EXPECT_TRUE(none.interrupted);
 }
 
@@ -195,7 +195,7 @@ class RunTest : public IsolationTest {
     runOptions_.makePhone = [] { return std::make_unique<TestPhone>(); };
   }
 
-  // What the events of a run in a process of its own come to.
+  // Runs in a separate process and returns the record of the events.
   DiagnosticRecord run(const std::string& pluginName, const std::string& name,
                        const std::vector<std::string>& texts = {}, const QZExperimentResult* result = nullptr) {
     options_.plugins = {plugin(pluginName)};
@@ -224,7 +224,7 @@ class RunTest : public IsolationTest {
     options_.deadlines = {{Stage::kRun, 1min}};
     return run("unruly", "Unruly", {"way=" + std::to_string(way)});
   }
-  // The same for a way that takes longer than its deadline.
+  // Like run(), with a way of misbehaving that exceeds the deadline.
   DiagnosticRecord runUnrulyForTooLong(int way) {
     options_.deadlines = {{Stage::kRun, 100ms}};
     return run("unruly", "Unruly", {"way=" + std::to_string(way)});
@@ -279,7 +279,7 @@ TEST_F(RunTest, AnalysesAResult) {
 }
 
 TEST_F(RunTest, LoadsOnlyThePluginsThatTheDiagnosticNeeds) {
-  const PluginScan all = survey({"working", "combining"});
+  const PluginScan all = scan({"working", "combining"});
   const auto runNow = [&](const std::string& name, const std::vector<std::string>& plugins) {
     options_.plugins.clear();
     for (const std::string& one : plugins) options_.plugins.push_back(plugin(one));
@@ -294,7 +294,7 @@ TEST_F(RunTest, LoadsOnlyThePluginsThatTheDiagnosticNeeds) {
     return textOf(builder.takeRecord().error);
   };
   EXPECT_EQ(runNow("Fake.One", {"fatal", "working", "combining"}), "");
-  // Its plug-in has another diagnostic, with a half that is not loaded.
+  // Its plug-in has another diagnostic whose analysis is not loaded.
   EXPECT_EQ(runNow("Combining.Own", {"fatal", "working", "combining"}), "");
   EXPECT_EQ(runNow("Combined", {"fatal", "working", "combining"}), "");
   EXPECT_EQ(runNow("Combined", {"combining"}), "QuazorHostErrorDomain 3 the plug-ins no longer register Combined");
@@ -335,7 +335,7 @@ TEST_F(RunTest, TurnsEachEndOfItsProcessIntoAFailureOfTheStage) {
     EXPECT_EQ(record.errorStage, Stage::kRun) << row.name;
     EXPECT_FALSE(isCompleted_) << row.name;
     EXPECT_TRUE(goesOn_) << row.name;
-    // What came before is kept.
+    // Earlier stages are kept.
     EXPECT_EQ(record.stages.size(), 4U) << row.name;
     EXPECT_EQ(logOf(record)[0], "an error line") << row.name;
   }
@@ -406,7 +406,7 @@ TEST_F(RunTest, ShowsTheFramesOfThePhoneInTheOtherProcess) {
   class SlowPhone final : public Phone {
    public:
     Platform platform() const override {
-      ::usleep(450'000);  // past the time for which nothing is shown
+      ::usleep(450'000);  // longer than the delay before progress is shown
       return nullPlatform();
     }
     std::vector<DeclaredFault> faults() const override { return {}; }

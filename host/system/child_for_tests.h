@@ -1,4 +1,4 @@
-// What children do in tests of this folder.
+// Functions for child processes in the tests of this folder.
 #pragma once
 
 #include <cstddef>
@@ -8,7 +8,7 @@
 
 namespace quazor {
 
-// Writes all of the text, or ends the process with exit code 99.
+// Writes all of the text, or exits with code 99.
 inline void say(int descriptor, std::string_view text) {
   while (!text.empty()) {
     const ssize_t written = ::write(descriptor, text.data(), text.size());

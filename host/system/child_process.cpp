@@ -29,10 +29,10 @@ namespace {
 using namespace std::chrono_literals;
 using SteadyClock = std::chrono::steady_clock;
 
-// Out of the way of descriptors that a plug-in opens, and of small numbers that it may close by mistake.
+// High enough to avoid descriptors that a plug-in opens, or closes by mistake.
 constexpr int kConnection = 250;
 constexpr SteadyClock::duration kMaxWait = 5s;
-// How long a process that restores the hardware may take for it.
+// The time limit of a cleanup process.
 constexpr SteadyClock::duration kMaxTidying = 1s;
 
 [[noreturn]] void refuse(const char* what) { throw std::system_error(errno, std::generic_category(), what); }
@@ -61,7 +61,7 @@ Pipe makePipe() {
   return {ends[0], ends[1]};
 }
 
-// The processes whose parent is this one (proc(5), /proc/PID/stat, field 4).
+// The child processes of this process (proc(5), /proc/PID/stat, field 4).
 std::vector<pid_t> childrenOfThisProcess() {
   std::vector<pid_t> children;
   const pid_t self = ::getpid();
@@ -72,7 +72,7 @@ std::vector<pid_t> childrenOfThisProcess() {
     std::ifstream file(entry.path() / "stat");
     std::string line;
     std::getline(file, line);
-    const std::size_t afterName = line.rfind(')');  // the name may hold anything
+    const std::size_t afterName = line.rfind(')');  // the name may contain any character
     int parent = 0;
     if (afterName == std::string::npos || std::sscanf(line.c_str() + afterName, ") %*c %d", &parent) != 1) continue;
     if (parent == self) children.push_back(static_cast<pid_t>(std::stol(name)));
@@ -80,7 +80,7 @@ std::vector<pid_t> childrenOfThisProcess() {
   return children;
 }
 
-// The name of a process, or nothing when it has ended.
+// The name of a process; nothing if it has ended.
 std::string nameOfProcess(pid_t process) {
   std::ifstream file("/proc/" + std::to_string(process) + "/comm");
   std::string name;
@@ -88,19 +88,19 @@ std::string nameOfProcess(pid_t process) {
   return name;
 }
 
-// Where there may be fewer descriptors, it is the last.
+// The last descriptor if the limit on descriptors is lower than kConnection.
 int numberOfConnection() {
   rlimit limit{};
   ::getrlimit(RLIMIT_NOFILE, &limit);
   return static_cast<int>(std::min<rlim_t>(kConnection, limit.rlim_cur - 1));
 }
 
-// Returns the number of the child's end of the connection.
+// Returns the descriptor of the child's end of the connection.
 int becomeChild(pid_t parent, const WatchedSignals& signals, const Pipe& connection, const Pipe& output,
                 std::optional<std::uint64_t> memory) {
   ::setpgid(0, 0);
   ::prctl(PR_SET_PDEATHSIG, SIGKILL);
-  if (::getppid() != parent) ::_exit(EXIT_FAILURE);  // it ended before it could be watched
+  if (::getppid() != parent) ::_exit(EXIT_FAILURE);  // the parent ended before the call above
   const int nothing = ::open("/dev/null", O_RDONLY | O_CLOEXEC);
   ::dup2(nothing, STDIN_FILENO);
   ::dup2(output.writeEnd, STDOUT_FILENO);
@@ -117,7 +117,7 @@ int becomeChild(pid_t parent, const WatchedSignals& signals, const Pipe& connect
   return number;
 }
 
-// An exception ends the child as any other program: it must not reach the callers of the process that was copied.
+// An exception must terminate the child: it must not propagate to callers that belong to the parent's copy.
 void doWork(const std::function<void(int)>& body, int connection) noexcept { body(connection); }
 
 }  // namespace
@@ -174,7 +174,7 @@ ChildProcess::ChildProcess(const WatchedSignals& signals, const std::function<vo
     doWork(body, becomeChild(parent, signals, connection, output, memory));
     ::_exit(EXIT_SUCCESS);
   }
-  ::setpgid(id_, id_);  // parent and child both call this; the first call takes effect
+  ::setpgid(id_, id_);  // both parent and child call this; the first call takes effect
   ::close(connection.writeEnd);
   ::close(output.writeEnd);
   connection_ = connection.readEnd;
@@ -194,7 +194,7 @@ ChildProcess::~ChildProcess() {
       if (!isRestoring || SteadyClock::now() >= begin + kMaxTidying) ::kill(one, SIGKILL);
       if (::waitpid(one, nullptr, WNOHANG) == 0) left.push_back(one);
     }
-    // What has been ended may have left further ones to this process, so only a look that finds nobody is the last.
+    // Killing a process can add its orphans to this process's children, so the loop ends only when no child is left.
     if (left.empty() && childrenOfThisProcess().size() <= others_.size()) return;
     if (SteadyClock::now() >= begin + kMaxWait) return;
     std::this_thread::sleep_for(1ms);
@@ -203,7 +203,7 @@ ChildProcess::~ChildProcess() {
 
 const std::optional<ProcessEnd>& ChildProcess::end() {
   siginfo_t info{};
-  // The system keeps the child until the destructor takes it, so that its number means no other process before.
+  // WNOWAIT keeps the zombie until the destructor reaps it, so the process ID is not reused before.
   if (!end_ && ::waitid(P_PID, static_cast<id_t>(id_), &info, WEXITED | WNOHANG | WNOWAIT) == 0 && info.si_pid == id_) {
     end_ = ProcessEnd{info.si_code != CLD_EXITED, info.si_status};
   }
@@ -211,7 +211,7 @@ const std::optional<ProcessEnd>& ChildProcess::end() {
 }
 
 void ChildProcess::signalGroup(int signal) const {
-  // The child may have left its group.
+  // The child may have left its process group.
   for (const pid_t whom : {-id_, id_}) {
     ::kill(whom, signal);
     ::kill(whom, SIGCONT);

@@ -25,20 +25,20 @@ namespace {
 using namespace std::chrono_literals;
 using testing::HasSubstr;
 
-// Waits for the child's end, at most a minute.
+// Waits up to a minute for the child to end.
 std::string endOf(ChildProcess& child) {
   for (int i = 0; i < 60'000 && !child.end(); ++i) std::this_thread::sleep_for(1ms);
   return child.end() ? textOf(*child.end()) : "it has not ended";
 }
 
-// What can be read from the descriptor until its other end is closed, or until `octets` have come.
-std::string readAll(int descriptor, std::size_t octets = SIZE_MAX) {
+// Reads from the descriptor until the other end is closed or `maximum` bytes have arrived.
+std::string readAll(int descriptor, std::size_t maximum = SIZE_MAX) {
   std::string text;
-  while (text.size() < octets) {
+  while (text.size() < maximum) {
     pollfd watched{descriptor, POLLIN, 0};
     if (::poll(&watched, 1, 60'000) != 1) return text + "... nothing more came";
     char buffer[256];
-    const ssize_t count = ::read(descriptor, buffer, std::min(sizeof buffer, octets - text.size()));
+    const ssize_t count = ::read(descriptor, buffer, std::min(sizeof buffer, maximum - text.size()));
     if (count <= 0) break;
     text.append(buffer, static_cast<std::size_t>(count));
   }
@@ -97,8 +97,8 @@ TEST_F(ChildProcessTest, HasAConnectionAndAnOutput) {
     std::printf("printed, ");
     std::fflush(stdout);
     say(STDERR_FILENO, "and complained");
-    char octet = 0;
-    if (::read(STDIN_FILENO, &octet, 1) != 0) ::_exit(1);
+    char byte = 0;
+    if (::read(STDIN_FILENO, &byte, 1) != 0) ::_exit(1);
   };
   ChildProcess child(signals_, body, std::nullopt);
   EXPECT_EQ(readAll(child.connectionDescriptor()), "said");
@@ -109,10 +109,10 @@ TEST_F(ChildProcessTest, HasAConnectionAndAnOutput) {
 TEST_F(ChildProcessTest, IsReadWithoutBlocking) {
   ChildProcess child(
       signals_, [](int) { hang(); }, std::nullopt);
-  char octet = 0;
-  EXPECT_EQ(::read(child.connectionDescriptor(), &octet, 1), -1);
+  char byte = 0;
+  EXPECT_EQ(::read(child.connectionDescriptor(), &byte, 1), -1);
   EXPECT_EQ(errno, EAGAIN);
-  EXPECT_EQ(::read(child.outputDescriptor(), &octet, 1), -1);
+  EXPECT_EQ(::read(child.outputDescriptor(), &byte, 1), -1);
   EXPECT_EQ(errno, EAGAIN);
 }
 
@@ -202,7 +202,7 @@ TEST_F(ChildProcessTest, GoesWithEverythingThatItStarted) {
   EXPECT_EQ(::kill(orphan, 0), -1);
 }
 
-// A process that ended left a guard, which takes so long to put the light out. Returns whether it did.
+// A process ends and leaves a cleanup process that needs `duration` to switch the light off. Returns whether it did.
 bool goesDark(const WatchedSignals& signals, std::chrono::milliseconds duration) {
   static std::chrono::milliseconds takes;
   takes = duration;

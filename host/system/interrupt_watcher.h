@@ -24,8 +24,8 @@ class InterruptWatcher {
   void watch(const std::function<void()>& interrupted) const;
 
   sigset_t maskBefore_{};
-  int signals_ = -1;  // readable when an interrupt has come
-  int stop_ = -1;     // readable when the watcher is to end
+  int signals_ = -1;  // readable when an interrupt has arrived
+  int stop_ = -1;     // readable when the watcher is to stop
   std::thread thread_;
 };
 

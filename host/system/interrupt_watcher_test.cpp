@@ -20,8 +20,7 @@ bool interruptIsBlocked() {
   return sigismember(&mask, SIGINT) == 1;
 }
 
-// Interrupts have their default meaning in these tests, however the tests were started: a shell's background jobs
-// ignore them.
+// Restores the default action of SIGINT, which a shell ignores in background jobs.
 class InterruptWatcherTest : public testing::Test {
  protected:
   InterruptWatcherTest() { setAction(SIG_DFL, &before_); }

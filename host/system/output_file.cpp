@@ -17,7 +17,7 @@ namespace quazor {
 
 namespace {
 
-constexpr mode_t kMode = 0666;  // less the umask
+constexpr mode_t kMode = 0666;  // reduced by the umask
 
 [[noreturn]] void refuse(const std::filesystem::path& file, const std::string& why) {
   throw CommandError(ExitCode::kCannotWrite, "the output file '" + file.string() + "' cannot be written: " + why);
@@ -27,7 +27,7 @@ constexpr mode_t kMode = 0666;  // less the umask
   refuse(file, std::strerror(errorNumber));
 }
 
-// Writes all of the text and closes the descriptor; the number of the error, or 0.
+// Writes all of the text and closes the descriptor. Returns 0 or an error number.
 int writeAndClose(int descriptor, std::string_view text) {
   int failure = 0;
   while (!text.empty() && failure == 0) {

@@ -24,7 +24,7 @@ std::size_t entriesIn(const fs::path& directory) {
   return static_cast<std::size_t>(std::distance(fs::directory_iterator(directory), fs::directory_iterator()));
 }
 
-// Why the file cannot be written; empty when nothing was thrown.
+// The reason why the file cannot be written; empty if nothing was thrown.
 template <class Call>
 std::string problemOf(const fs::path& file, const Call& call) {
   const std::string beginning = "the output file '" + file.string() + "' cannot be written: ";
@@ -93,7 +93,7 @@ TEST_F(OutputFileTest, LeavesTheOldContentAndNothingElseWhenWritingFails) {
   rlimit before{};
   ASSERT_EQ(getrlimit(RLIMIT_FSIZE, &before), 0);
   const auto handler = std::signal(SIGXFSZ, SIG_IGN);
-  const rlimit small{4, before.rlim_max};  // bytes that a file may have
+  const rlimit small{4, before.rlim_max};  // maximum file size in bytes
   ASSERT_EQ(setrlimit(RLIMIT_FSIZE, &small), 0);
   const std::string problem = writingOf(file, "longer than that");
   setrlimit(RLIMIT_FSIZE, &before);

@@ -16,14 +16,14 @@ using Moment = Supervision::Moment;
 using SteadyClock = std::chrono::steady_clock;
 
 constexpr std::chrono::milliseconds kTick = 100ms;
-// How long a child may take to end by itself when it has nothing more to say, and after SIGTERM.
+// How long a finished child may take to exit, and any child after SIGTERM.
 constexpr std::chrono::milliseconds kGrace = 500ms;
-// How long a killed process is waited for: one that is stuck in the kernel does not end.
+// How long to wait for a killed process: one that is blocked in the kernel does not end.
 constexpr std::chrono::seconds kMaxDeath = 5s;
 constexpr std::size_t kMaxOutputLength = 1U << 16;
 
-// Cuts what is read from a descriptor into lines. One that is longer than `longest`, in octets, is cut too or, with
-// kRefuse, dropped: reading is over then.
+// Splits the input from a descriptor into lines. A line of more than `longest` bytes is split or, with kRefuse,
+// dropped; reading then stops.
 class LineReader {
  public:
   enum class LongLines { kCut, kRefuse };
@@ -32,34 +32,34 @@ class LineReader {
       : descriptor_(descriptor), longest_(longest), longLines_(longLines) {}
 
   int descriptor() const { return descriptor_; }
-  // True when nothing more will come.
+  // True at the end of the input.
   bool atEnd() const { return atEnd_; }
-  // True when a line was too long and was dropped.
+  // True if a line was too long and was dropped.
   bool hasRefused() const { return hasRefused_; }
 
-  // Reads what there is, up to a bound, and hands its lines on until `take` returns false, or a line is refused.
-  // Returns that.
+  // Reads the available input, up to a limit, and passes its lines to `take`. Returns false if `take` did or if a line
+  // was too long.
   template <class Take>
   bool read(Take&& take) {
-    std::array<char, 65536> octets;
+    std::array<char, 65536> bytes;
     for (int i = 0; i < kMaxReads; ++i) {
-      const ssize_t count = ::read(descriptor_, octets.data(), octets.size());
-      if (count < 0) return true;  // nothing at the moment
+      const ssize_t count = ::read(descriptor_, bytes.data(), bytes.size());
+      if (count < 0) return true;  // no input at the moment
       if (count == 0) {
         atEnd_ = true;
         return true;
       }
-      text_.append(octets.data(), static_cast<std::size_t>(count));
+      text_.append(bytes.data(), static_cast<std::size_t>(count));
       if (!cut(take)) return false;
     }
     return true;
   }
 
-  // What came after the last end of a line.
+  // The input after the last line end.
   const std::string& rest() const { return text_; }
 
  private:
-  // So many that reading is not interrupted for each, and so few that other descriptors have their turn.
+  // Few enough to give other descriptors a turn, enough to avoid a poll for each read.
   static constexpr int kMaxReads = 16;
 
   template <class Take>
@@ -85,7 +85,7 @@ class LineReader {
   const std::size_t longest_;
   const LongLines longLines_;
   std::string text_;
-  std::size_t searched_ = 0;  // there is no end of a line before
+  std::size_t searched_ = 0;  // the first `searched_` bytes contain no line end
   bool atEnd_ = false;
   bool hasRefused_ = false;
 };
@@ -139,13 +139,13 @@ class Supervisor {
     if (limit_) {
       goOnEnding(now);
     } else if (supervision_.isDone()) {
-      limit_ = now + kGrace;  // it ends by itself
+      limit_ = now + kGrace;  // gives the child time to exit by itself
     } else if (signals_.requestsToEnd() > requestsBefore_) {
       beginEnding(SupervisionEnd::kInterrupted, now);
     } else if (isBad_) {
       beginEnding(endOfBadConnection(), now);
     } else if (connection_.atEnd()) {
-      // A process that ends closes its connection a moment before.
+      // A process closes its connection shortly before it ends.
       how_ = SupervisionEnd::kConnectionLost;
       limit_ = now + kGrace;
       endsByItself_ = true;
@@ -174,7 +174,7 @@ class Supervisor {
     limit_ = now + kMaxDeath;
   }
 
-  // What the child wrote before its end is still to be read: it is in the pipes, which hold less than is read at once.
+  // Reads the remaining output of the ended child. It is still in the pipes, which hold less than readAll() reads.
   void drainEnded() {
     if (endsByItself_ && child_.end()) how_ = SupervisionEnd::kEnded;
     child_.signalGroup(SIGKILL);
@@ -191,7 +191,7 @@ class Supervisor {
   LineReader output_;
   const int requestsBefore_;
   SupervisionEnd how_ = SupervisionEnd::kEnded;
-  std::optional<Moment> limit_;  // while the child is expected to end
+  std::optional<Moment> limit_;  // when the wait for the child's exit ends
   bool endsByItself_ = false;
   bool killed_ = false;
   bool gaveUp_ = false;

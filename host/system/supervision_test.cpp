@@ -34,8 +34,8 @@ class SupervisionTest : public testing::Test {
     supervision_.tick = [this] { ++ticks_; };
   }
 
-  // Lets a child do that, and says how it ended: "how, exit code or signal". Its line "ready" brings the deadline near,
-  // "interrupt" asks this process to end, "garbage" is none that it should write, and "done" is its last.
+  // Runs `body` in a child and returns "how, exit code or signal". The child's lines: "ready" shortens the deadline,
+  // "interrupt" asks this process to end, "garbage" is not allowed, and "done" is the last.
   std::string run(const std::function<void(int connection)>& body) {
     const steady_clock::time_point begin = steady_clock::now();
     ChildProcess child(signals_, body, std::nullopt);
@@ -102,8 +102,8 @@ TEST_F(SupervisionTest, TakesTheLinesOfBothOutputsAndALastOneWithoutEnd) {
 }
 
 TEST_F(SupervisionTest, CutsALineOfOutputThatIsTooLong) {
-  constexpr std::size_t kOctets = 1'000'000;
-  EXPECT_EQ(run([](int) { say(STDOUT_FILENO, std::string(kOctets, 'x') + "\nend\n"); }), "ended, exit code 0");
+  constexpr std::size_t kBytes = 1'000'000;
+  EXPECT_EQ(run([](int) { say(STDOUT_FILENO, std::string(kBytes, 'x') + "\nend\n"); }), "ended, exit code 0");
   ASSERT_GT(output_.size(), 2U);
   EXPECT_EQ(output_.back(), "end");
   output_.pop_back();
@@ -112,7 +112,7 @@ TEST_F(SupervisionTest, CutsALineOfOutputThatIsTooLong) {
     EXPECT_LE(line.size(), 2U << 16);
     all += line;
   }
-  EXPECT_EQ(all, std::string(kOctets, 'x'));
+  EXPECT_EQ(all, std::string(kBytes, 'x'));
 }
 
 TEST_F(SupervisionTest, TellsExitCodesAndSignals) {
@@ -268,7 +268,7 @@ TEST_F(SupervisionTest, EndsTheChildWhenThisProcessIsAskedToEnd) {
   ASSERT_EQ(::kill(::getpid(), SIGINT), 0);
   EXPECT_EQ(run([](int) { hang(); }), "interrupted, signal 15 (SIGTERM)");
   EXPECT_EQ(signals_.requestsToEnd(), 1);
-  // It counts for one child alone.
+  // An earlier request to end does not affect a later child.
   EXPECT_EQ(run([](int) { ::usleep(20'000); }), "ended, exit code 0");
 }
 
@@ -286,10 +286,10 @@ TEST_F(SupervisionTest, LosesNoTimeWhenItIsAskedAgain) {
   steady_clock::time_point asked;
   supervision_.takeLine = [&asked](std::string_view /*line*/) {
     asked = steady_clock::now();
-    // Two signals of one kind might come as one.
+    // Pending signals of the same kind are merged.
     return ::kill(::getpid(), SIGINT) == 0 && ::kill(::getpid(), SIGTERM) == 0;
   };
-  // Waiting takes half a second every time; a busy machine does not.
+  // Polling would always take half a second; a busy machine only sometimes does.
   for (int attempt = 0; attempt < 20; ++attempt) {
     ASSERT_EQ(run([](int connection) {
                 ::signal(SIGTERM, SIG_IGN);

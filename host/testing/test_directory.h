@@ -12,7 +12,7 @@
 
 namespace quazor {
 
-// A new directory, which is removed with everything in it when this goes.
+// A new directory, removed with its content at the end of this object's lifetime.
 class TestDirectory {
  public:
   TestDirectory() {
@@ -29,7 +29,7 @@ class TestDirectory {
 
   const std::filesystem::path& path() const { return path_; }
 
-  // Writes a file in it, with the directories on the way.
+  // Writes a file in it and creates missing directories.
   std::filesystem::path write(const std::filesystem::path& name, std::string_view content) const {
     const std::filesystem::path file = path_ / name;
     std::filesystem::create_directories(file.parent_path());

@@ -1,4 +1,4 @@
-// Variables of the environment in tests.
+// Environment variables in tests.
 #pragma once
 
 #include <stdlib.h>
@@ -8,7 +8,7 @@
 
 namespace quazor {
 
-// While it lives, the variable has that value; null: it is not there.
+// Sets the variable, or unsets it if the value is null, and restores it at the end of its lifetime.
 class EnvironmentVariable {
  public:
   EnvironmentVariable(std::string name, const char* value) : name_(std::move(name)) {

@@ -17,7 +17,7 @@ void append(std::vector<RunEvent>& events, std::vector<RunEvent> more) {
   events.insert(events.end(), std::make_move_iterator(more.begin()), std::make_move_iterator(more.end()));
 }
 
-// The events of the diagnostic that is open, and what closes it.
+// Completes the events of the diagnostic in progress with those that end it.
 std::vector<RunEvent> closed(std::vector<RunEvent> events) {
   RecordBuilder builder;
   for (const RunEvent& event : events) builder.onEvent(event);

@@ -9,7 +9,7 @@
 
 namespace quazor {
 
-// Keeps what it takes.
+// Stores all events.
 class EventList final : public RunEventSink {
  public:
   void onEvent(const RunEvent& event) override { events.push_back(event); }
@@ -17,7 +17,7 @@ class EventList final : public RunEventSink {
   std::vector<RunEvent> events;
 };
 
-// So many milliseconds after 2026-11-21 01:08:00 UTC.
+// That many milliseconds after 2026-11-21 01:08:00 UTC.
 inline Date momentAt(int milliseconds) {
   using namespace std::chrono;
   return Date(sys_days(year(2026) / 11 / 21)) + hours(1) + minutes(8) + std::chrono::milliseconds(milliseconds);
@@ -27,18 +27,17 @@ RunStarted runOf(std::vector<std::string> names);
 
 DiagnosticStarted beginningOf(const std::string& name);
 
-// A result that passes when its value is 90 or more.
+// A result that passes if its value is 90 or more.
 QZMeasuredResult resultOf(double value);
 
-// Of a diagnostic's run as it goes well, from DiagnosticStarted to DiagnosticCompleted, with every kind of event that
-// there is in it.
+// The events of a diagnostic that passes, from DiagnosticStarted to DiagnosticCompleted, of every possible kind.
 std::vector<RunEvent> wholeDiagnostic(const std::string& name, double value);
 
-// The diagnostics Good (pass), Bad (fail), Strange (error, as its value is not a number) and Broken (error: its run
-// failed), in a whole run.
+// A complete run of the diagnostics Good (pass), Bad (fail), Strange (error, because its value is not a number) and
+// Broken (error: its run failed).
 std::vector<RunEvent> wholeRun();
 
-// The names of events in their order, separated by blanks.
+// The names of the events in order, separated by spaces.
 std::string namesOf(const std::vector<RunEvent>& events);
 
 }  // namespace quazor

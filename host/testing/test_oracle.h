@@ -1,4 +1,4 @@
-// What a verdict must be, found in another way than the judge finds it.
+// An oracle for verdicts, implemented differently from the judge.
 #pragma once
 
 #include "host/model/judge.h"
@@ -9,12 +9,12 @@
 
 namespace quazor {
 
-// One end of a limit as plain numbers.
+// One bound of a limit as plain numbers.
 struct OracleBound {
   bool isThere = false;
   double value = 0;
   bool open = false;
-  bool isUsable = true;  // finite, and in the value's unit
+  bool isUsable = true;  // finite and in the unit of the value
 };
 
 inline OracleBound oracleBound(const std::shared_ptr<const QZBound>& bound, const Measurement& measured) {
@@ -46,8 +46,8 @@ inline OracleResult oracleResult(const QZMeasuredResult& result) {
   return judged;
 }
 
-// PASS if and only if there is at least one result, every limited one is inside of its bounds, finite and in their
-// unit, nothing went wrong and the run was completed.
+// PASS if and only if there is at least one result, every limited one is finite, inside its bounds and in their unit,
+// there was no error and the run was completed.
 inline Verdict oracleVerdict(const std::vector<QZMeasuredResult>& results, bool hasError, bool completed) {
   if (hasError || !completed || results.empty()) return Verdict::kError;
   const auto all = [&results](auto&& holds) {

@@ -10,7 +10,7 @@
 
 namespace quazor {
 
-// A clock whose time passes only in sleep(). It begins at 7 s.
+// A clock that advances only in sleep(). It starts at 7 s.
 class ManualClock final : public Clock {
  public:
   std::chrono::nanoseconds now() const override { return time; }
@@ -20,7 +20,7 @@ class ManualClock final : public Clock {
   std::chrono::nanoseconds time = std::chrono::seconds(7);
 };
 
-// A phone on which only time passes. It says that one fault fired three times, and that 17 frames have come.
+// A phone with only a clock. It reports that one fault fired three times and that 17 frames were delivered.
 class TestPhone final : public Phone {
  public:
   Platform platform() const override {

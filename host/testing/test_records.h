@@ -25,7 +25,7 @@ inline std::vector<JudgedResult> judgeResults(const std::vector<QZMeasuredResult
   return judged;
 }
 
-// A record with one limited result, one for information, and something of everything else.
+// A record with a limited result, an informational one, and an entry in every other list.
 inline DiagnosticRecord recordOf(const std::string& name, Verdict verdict) {
   using namespace std::chrono_literals;
   DiagnosticRecord record;

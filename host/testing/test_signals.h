@@ -1,11 +1,11 @@
-// Signals in tests of what watches for them.
+// Signal actions in tests.
 #pragma once
 
 #include <signal.h>
 
 namespace quazor {
 
-// While it lives, a signal has that action.
+// Sets the action of a signal during its lifetime.
 class SignalAction {
  public:
   SignalAction(int signal, void (*handler)(int)) : signal_(signal) {
@@ -22,8 +22,8 @@ class SignalAction {
   struct sigaction before_ {};
 };
 
-// The requests to end a process have their default meaning in a test, however the tests were started: a shell's
-// background jobs ignore interrupts.
+// Restores the default action of the signals that request the end of a process; a shell ignores interrupts in
+// background jobs.
 class DefaultRequestsToEnd {
  public:
   DefaultRequestsToEnd() : interrupt_(SIGINT, SIG_DFL), termination_(SIGTERM, SIG_DFL), hangUp_(SIGHUP, SIG_DFL) {}

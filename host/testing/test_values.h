@@ -1,4 +1,4 @@
-// Random values for property tests, and their comparison to the bit.
+// Random values for property tests, and their bitwise comparison.
 #pragma once
 
 #include "contract/diagnostic_error.h"
@@ -15,10 +15,10 @@ namespace quazor {
 inline constexpr double kInf = std::numeric_limits<double>::infinity();
 inline constexpr double kNan = std::numeric_limits<double>::quiet_NaN();
 
-// "DOMAIN CODE MESSAGE"; empty for no error.
+// "DOMAIN CODE MESSAGE"; empty if there is no error.
 std::string textOf(const DiagnosticErrorPtr& error);
 
-// One seed is one sequence of values.
+// Equal seeds generate equal values.
 class RandomValues {
  public:
   explicit RandomValues(std::uint64_t seed) : engine_(seed) {}
@@ -26,21 +26,21 @@ class RandomValues {
   std::uint64_t bits() { return engine_(); }
   std::uint64_t below(std::uint64_t bound) { return bits() % bound; }
   bool chance(unsigned percent) { return below(100) < percent; }
-  // From the least to the greatest, both included.
+  // A number from `least` to `greatest`, inclusive.
   std::int64_t between(std::int64_t least, std::int64_t greatest);
 
-  // Any double: often one of the special ones, and not-a-number among them.
+  // Any double; special values, including not-a-number, are frequent.
   double number();
-  // Any octets: often well-formed UTF-8, often not, sometimes none.
+  // Any bytes: often valid UTF-8, often invalid, sometimes none.
   std::string text();
-  // A moment between the years 1678 and 2261.
+  // A time between the years 1678 and 2261.
   Date date();
-  // Of any kind, with at most `depth` levels of values in it.
+  // A value of any kind, with at most `depth` levels of nesting.
   Value value(int depth);
   Dictionary dictionary(int depth);
   DiagnosticErrorPtr error(int depth);
   Measurement measurement();
-  // With a limit or without, whatever its bounds are.
+  // With or without a limit; the bounds are arbitrary.
   QZMeasuredResult result();
 
  private:
@@ -50,7 +50,7 @@ class RandomValues {
   std::mt19937_64 engine_;
 };
 
-// An object that is known by its text alone.
+// An object that is identified by its text.
 class NamedObject final : public Object {
  public:
   explicit NamedObject(std::string name) : name_(std::move(name)) {}
@@ -61,8 +61,8 @@ class NamedObject final : public Object {
   const std::string name_;
 };
 
-// Equal to the bit, but for the bits of a not-a-number; entries in the same order; errors by their content, objects by
-// their description.
+// Bitwise equality, except that all not-a-numbers are equal. Dictionaries must have the same order of entries; errors
+// are compared by content, objects by description.
 bool isSame(double a, double b);
 bool isSame(const Value& a, const Value& b);
 bool isSame(const Dictionary& a, const Dictionary& b);

@@ -1,4 +1,4 @@
-// Numbers as they stand on a command line.
+// Parses numbers of a command line.
 #pragma once
 
 #include "contract/value.h"
@@ -7,9 +7,9 @@
 
 namespace quazor {
 
-// The number that `text` is, all of it: an integer stays one, signed where that holds it and unsigned above; anything
-// else is a double, an integer beyond 64 bits too. Throws InputError, one clause, for a text that is not a decimal
-// number, is not finite, or lies outside the range of doubles. No locale has any influence.
+// Parses all of `text` as a number: an integer becomes signed if it fits in 64 bits, else unsigned; everything else,
+// including larger integers, becomes a double. Throws InputError, with a clause as its text, if the text is not a
+// decimal number, is not finite or is out of the range of doubles. Does not depend on the locale.
 Value parseNumber(std::string_view text);
 
 }  // namespace quazor

@@ -12,14 +12,14 @@ namespace {
 
 constexpr long kRows = 4;
 
-// A cell by the part of it that is filled, from none to all.
+// Characters for a cell by its filled fraction, from empty to full.
 using Glyphs = std::span<const std::string_view>;
 
 constexpr std::string_view kBlocks[] = {" ",      "\u2581", "\u2582", "\u2583", "\u2584",
                                         "\u2585", "\u2586", "\u2587", "\u2588"};
 constexpr std::string_view kAscii[] = {" ", ".", ":"};
 
-// The length of each sample's bar: from 1 to `longest`, or 0 for no bar.
+// The length of each sample's bar: 1 to `longest`, or 0 for no bar.
 std::vector<long> barsOf(const std::vector<double>& samples, long longest) {
   double low = std::numeric_limits<double>::infinity();
   double high = -low;
@@ -28,7 +28,7 @@ std::vector<long> barsOf(const std::vector<double>& samples, long longest) {
     low = std::min(low, sample);
     high = std::max(high, sample);
   }
-  const double span = high / 2 - low / 2;  // halved, since the whole span may be beyond all numbers
+  const double span = high / 2 - low / 2;  // halved, because the full span may overflow
   std::vector<long> bars;
   bars.reserve(samples.size());
   for (const double sample : samples) {

@@ -6,10 +6,9 @@
 
 namespace quazor {
 
-// A bar for each sample, from the lowest sample, whose bar is the shortest, to the highest, whose bar fills all rows: a
-// column a sample, four lines or fewer from top to bottom, without blanks at their ends. Samples that are not finite
-// have no bar. With `blocks` the lines are UTF-8 text of block elements, eight steps a line; else ASCII, a half line
-// (.) or a whole one (:).
+// A bar chart with one column per sample and at most four lines, top to bottom, without trailing blanks. The lowest
+// sample has the shortest bar and the highest has a full column; samples that are not finite have none. With `blocks`
+// the lines are UTF-8 block elements with eight steps per line, otherwise ASCII with half (.) and full (:) lines.
 std::vector<std::string> pictureOf(const std::vector<double>& samples, bool blocks);
 
 }  // namespace quazor

@@ -19,7 +19,7 @@ std::size_t widthOf(std::string_view text) {
 
 bool isControl(unsigned char unit) { return unit < 0x20 || unit == 0x7F; }
 
-// The control characters U+0080 to U+009F, two bytes in UTF-8: terminals obey them too.
+// True for the control characters U+0080 to U+009F, two bytes in UTF-8, which terminals also interpret.
 bool isWideControl(std::string_view character) {
   return character.size() == 2 && character[0] == '\xC2' && static_cast<unsigned char>(character[1]) < 0xA0;
 }
@@ -37,7 +37,7 @@ std::string shownText(std::string_view text, std::string_view allowed) {
     const std::string_view character = text.substr(0, sequence.length);
     text.remove_prefix(sequence.length);
     if (isWideControl(character)) {
-      appendEscaped(shown, character.substr(1));  // the code point's number is that of its second byte
+      appendEscaped(shown, character.substr(1));  // the second byte equals the code point
     } else if (!sequence.wellFormed || (isControl(static_cast<unsigned char>(character.front())) &&
                                         allowed.find(character.front()) == std::string_view::npos)) {
       appendEscaped(shown, character);
@@ -48,7 +48,7 @@ std::string shownText(std::string_view text, std::string_view allowed) {
   return shown;
 }
 
-// Up to the next blank outside of back quotes; takes it, and the blanks after it, off the text.
+// Removes the first word, which ends at a blank outside back quotes, and the following blanks, and returns the word.
 std::string_view takeWord(std::string_view& text) {
   bool quoted = false;
   std::size_t end = 0;
@@ -84,7 +84,7 @@ std::string wrapped(std::string_view text, std::string_view first, std::string_v
   const std::string shown = printable(text);
   std::string lines;
   std::string line(first);
-  bool empty = true;  // but for its beginning
+  bool empty = true;  // `line` contains only its prefix
   for (std::string_view left = shown; !left.empty();) {
     const std::string_view word = takeWord(left);
     if (!empty && widthOf(line) + 1 + widthOf(word) > kWidestLine) {

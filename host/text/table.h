@@ -1,4 +1,4 @@
-// Text for people: tables, and names that come from elsewhere.
+// Terminal text: tables, and untrusted names.
 #pragma once
 
 #include <cstddef>
@@ -9,22 +9,22 @@
 
 namespace quazor {
 
-// The text with its control characters, new lines too, and each byte that is not UTF-8 shown as \xNN: what a plug-in or
-// a file says must not steer the reader's terminal, nor break its text.
+// Escapes control characters, including newlines, and bytes that are not UTF-8 as \xNN. Text from a plug-in or a file
+// must not control the user's terminal.
 std::string printable(std::string_view text);
 
-// As printable, but tabs and new lines stay: for text that may have several lines.
+// Like printable(), but keeps tabs and newlines, for text of several lines.
 std::string printableLines(std::string_view text);
 
-// As printable, but each line of the text begins with `indent` and ends with a new line.
+// Like printable(), but each line of the text begins with `indent` and ends with a newline.
 std::string indentedLines(std::string_view text, std::string_view indent);
 
-// "1 event", "2 events": a number of things whose plural ends with an s.
+// "1 event", "2 events": a count of something whose plural ends in s.
 std::string countText(std::size_t number, std::string_view what);
 
-// The text, as printable, in lines of at most 80 columns: the first one begins with `first`, the others with `rest`.
-// Lines are broken at blanks, but not inside of `back quotes`: a command stays in one piece. What has no place to break
-// it may be longer.
+// The printable() text in lines of at most 80 columns. The first line begins with `first`, the others with `rest`.
+// Lines are broken at blanks, except inside `back quotes`, so that commands are not split. A word that does not fit
+// makes its line longer.
 std::string wrapped(std::string_view text, std::string_view first, std::string_view rest);
 
 // Cells in aligned columns. Widths count code points.
@@ -36,10 +36,11 @@ class Table {
   // One alignment per column.
   explicit Table(std::vector<Align> columns) : columns_(std::move(columns)) {}
 
-  // As many cells as there are columns. `before` and `after` stand around the last cell and have no width: its colour.
+  // Takes one cell per column. `before` and `after` surround the last cell and count as zero columns: they set its
+  // colour.
   void addRow(std::vector<std::string> cells, std::string before = {}, std::string after = {});
 
-  // One line per row, each beginning with `indent`; no blanks at the ends.
+  // Prints one line per row, each beginning with `indent` and without trailing blanks.
   void print(std::ostream& out, std::string_view indent) const;
 
  private:

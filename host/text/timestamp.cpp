@@ -16,7 +16,7 @@ std::string padded(std::uint64_t number, std::size_t width) {
   return digits.size() < width ? std::string(width - digits.size(), '0') + digits : digits;
 }
 
-// The number in decimal digits at that place of a text that has kForm.
+// Parses the decimal digits at that place of a text that matches kForm.
 std::int64_t numberAt(std::string_view text, std::size_t begin, std::size_t length) {
   std::int64_t number = 0;
   std::from_chars(text.data() + begin, text.data() + begin + length, number);
@@ -58,7 +58,7 @@ std::optional<Date> parseTimestamp(std::string_view text) {
   const std::int64_t hour = numberAt(text, 11, 2);
   const std::int64_t minute = numberAt(text, 14, 2);
   const std::int64_t second = numberAt(text, 17, 2);
-  // What nanoseconds in 64 bits reach, in whole years.
+  // The range of 64-bit nanoseconds in complete years.
   constexpr int kFirstYear = 1678;
   constexpr int kLastYear = 2261;
   const int ofYear = static_cast<int>(calendar.year());

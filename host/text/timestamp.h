@@ -1,4 +1,4 @@
-// Moments of the wall clock as text, in the form of RFC 3339.
+// Formats and parses dates according to RFC 3339.
 #pragma once
 
 #include "contract/value.h"
@@ -9,13 +9,13 @@
 
 namespace quazor {
 
-// This moment, by the system's clock.
+// The current date by the system's clock.
 Date dateNow();
 
-// "2026-11-21T01:08:00.123456789Z": UTC, always with nine digits after the point, so that texts sort as moments do.
+// "2026-11-21T01:08:00.123456789Z": always UTC with nine decimals, so that the order of texts is the order of dates.
 std::string timestampText(Date date);
 
-// The moment of such a text; nothing for any other.
+// Parses such a text; nothing for any other.
 std::optional<Date> parseTimestamp(std::string_view text);
 
 }  // namespace quazor

@@ -21,7 +21,7 @@ std::string_view referenceOf(char character, bool inAttribute) {
     case '<': return "&lt;";
     case '>': return "&gt;";
     case '"': return "&quot;";
-    case '\r': return "&#13;";  // a reader makes a line feed of a plain one
+    case '\r': return "&#13;";  // a parser would turn a literal one into a line feed
     case '\t': return inAttribute ? "&#9;" : "";
     case '\n': return inAttribute ? "&#10;" : "";
     default: return "";

@@ -1,4 +1,4 @@
-// Text in XML 1.0, whatever bytes it holds.
+// Escapes arbitrary bytes as XML 1.0 text.
 #pragma once
 
 #include <string>
@@ -6,12 +6,12 @@
 
 namespace quazor {
 
-// The text between tags, in UTF-8. U+FFFD stands for what is not UTF-8, once for each sequence that no character begins
-// with (Unicode, "U+FFFD Substitution of Maximal Subparts"), and for each character that XML 1.0 does not allow: the
-// control characters but tab, line feed and carriage return, U+FFFE and U+FFFF.
+// Escapes character data, in UTF-8. U+FFFD replaces each invalid sequence (Unicode, "U+FFFD Substitution of Maximal
+// Subparts") and each character that XML 1.0 does not allow: the control characters except tab, line feed and carriage
+// return, U+FFFE and U+FFFF.
 std::string xmlText(std::string_view text);
 
-// The same for the value of an attribute in double quotes. Tabs and line ends read back as they were.
+// Escapes the value of an attribute in double quotes. A parser returns tabs and line ends unchanged.
 std::string xmlAttribute(std::string_view text);
 
 }  // namespace quazor

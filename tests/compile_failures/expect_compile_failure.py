@@ -1,11 +1,11 @@
 #!/usr/bin/env python3
-"""Checks that a mistake is refused by the compiler, and for the right reason.
+"""Checks that the compiler rejects a mistake, and for the right reason.
 
     expect_compile_failure.py --compiler CXX --root INCLUDE_ROOT SNIPPET
     expect_compile_failure.py --compiler CXX --self-test
 
-A snippet's first line is `// refused with: REGULAR EXPRESSION`. Compiled with -DCORRECTED it must compile, so that
-it cannot fail for another reason; without, it must not, and the compiler's words must match the expression.
+A snippet's first line is `// refused with: REGULAR EXPRESSION`. It must compile with -DCORRECTED, so that it cannot
+fail for another reason; without, it must not, and the compiler's messages must match the expression.
 """
 
 import argparse
@@ -20,7 +20,7 @@ FIRST_LINE = re.compile(r"// refused with: (.+)")
 
 
 def fault_of(compiler, root, snippet):
-    """What is wrong with the snippet's behaviour, or None."""
+    """Describes what is wrong with the snippet's behaviour; None if it is correct."""
     first_line = FIRST_LINE.fullmatch(snippet.read_text(encoding="utf-8").splitlines()[0])
     if first_line is None:
         return "its first line does not say with which words it is refused"
@@ -35,7 +35,7 @@ def fault_of(compiler, root, snippet):
     mistaken = compile_it()
     if mistaken.returncode == 0:
         return "the mistake compiles"
-    # Without the quoted source lines: those hold the mistake itself. Notes count, as clang gives reasons in them.
+    # Omits the quoted source lines, which contain the mistake itself. Includes notes, in which clang explains reasons.
     errors = "\n".join(line for line in mistaken.stderr.splitlines() if re.search("(error|note):", line))
     if re.search(first_line.group(1), errors) is None:
         return f"refused, but not with '{first_line.group(1)}':\n{mistaken.stderr}"
@@ -43,7 +43,7 @@ def fault_of(compiler, root, snippet):
 
 
 def self_test(compiler):
-    """Snippets of which each is wrong in one way, and a right one. Returns an exit code."""
+    """Tests this program with invalid snippets and a valid one. Returns an exit code."""
     mistake = "#ifdef CORRECTED\nint one = 1;\n#else\nint one = nothing;\n#endif\n"
     snippets = {
         "// refused with: 'nothing'|nothing\n" + mistake: None,

@@ -1,4 +1,4 @@
-// Any bytes as a report descriptor: what it says within its bounds, or a reason.
+// Arbitrary bytes as a report descriptor: parsing gives values within their limits, or a reason.
 #include "backends/linux/hid/hid_report_descriptor.h"
 #include "base/text/input_error.h"
 

@@ -1,4 +1,4 @@
-// Any text as a number of the command line: a number that is finite, or a reason.
+// Arbitrary text as a number on the command line: parsing gives a finite number, or a reason.
 #include "base/text/input_error.h"
 #include "host/text/parameter_number.h"
 

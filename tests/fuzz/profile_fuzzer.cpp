@@ -1,4 +1,4 @@
-// Any text as a profile: a profile, or an error with a sentence.
+// Arbitrary text as a profile: parsing gives a profile, or an error with a sentence.
 #include "base/text/input_error.h"
 #include "host/plugin/profile.h"
 

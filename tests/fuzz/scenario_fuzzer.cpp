@@ -1,4 +1,4 @@
-// Any bytes as a scenario file: a scenario of which a phone can be made, or a sentence.
+// Arbitrary bytes as a scenario file: parsing gives a scenario from which a phone can be created, or a sentence.
 #include "backends/simulated/scenario/scenario.h"
 #include "backends/simulated/simulated_phone.h"
 #include "base/text/input_error.h"

@@ -1,5 +1,5 @@
-// Any input reports in any order, with errors, closes and removals between them: only whole images reach the receiver,
-// with the values that are in their bytes, and an error is the last thing that does.
+// Arbitrary input reports in any order, mixed with errors, closes and removals: only complete images reach the
+// receiver, with the values in their bytes, and nothing follows an error.
 #include "diagnostics/sensor_images/nimbe_image_experiment.h"
 #include "tests/support/hand_made_sensor.h"
 
@@ -26,7 +26,7 @@ void require(bool holds, const char* rule) {
   std::abort();
 }
 
-// The record as a compiler of this machine lays it out: a second way to read it.
+// The record as a struct in this machine's layout, an independent way to read it.
 struct Record {
   std::uint8_t reportID;
   std::uint8_t reserved1;
@@ -60,7 +60,7 @@ void requireImage(const Value& frameID, const Array& scanI, const Array& scanQ, 
   requireSamples(scanQ, record.scanQ);
 }
 
-// Numbers from the input; zeros when it is used up.
+// Numbers from the input; zeros after its end.
 class Input {
  public:
   Input(const std::uint8_t* data, std::size_t size) : at_(data), end_(data + size) {}
@@ -74,12 +74,12 @@ class Input {
 
   struct Report {
     std::uint8_t reportID;
-    Bytes data;  // of exactly the report's size, so that a read beyond it is seen
+    Bytes data;  // exactly as long as the report, so that a read past the end is detected
 
     bool isImage() const { return reportID == 0x76 && data.size() >= 792; }
   };
-  // Half of them image reports by their ID; of the right length, of one near it, or of any. A part of the bytes is
-  // given, the others follow from a byte.
+  // Half of them are image reports by ID; the length is right, nearly right, or arbitrary. The input contains some of
+  // the bytes; the others are derived from one byte.
   Report report() {
     const std::uint8_t choice = byte();
     Report report{(choice & 1) != 0 ? std::uint8_t{0x76} : byte(), Bytes(length(choice))};
@@ -106,7 +106,7 @@ class Input {
 
 DiagnosticErrorPtr someError() { return makeError("BenchErrorDomain", 7, "Broken."); }
 
-// Remembers what it was last told, and does what it was told to while it is told.
+// Records the last call and performs a planned reaction during it.
 class Receiver final : public QZNimbeImageStreamDelegate {
  public:
   void handleImage(std::shared_ptr<QZNimbeCorvaneImage> image) override {
@@ -127,7 +127,7 @@ class Receiver final : public QZNimbeImageStreamDelegate {
   std::size_t errors = 0;
 };
 
-// A stream whose reports come at once, and what has to come of them.
+// A stream whose reports are delivered at once, and the expected deliveries.
 class StreamRun {
  public:
   explicit StreamRun(bool careless) {
@@ -195,7 +195,7 @@ class StreamRun {
       stream_->setDelegate({});
     }
   }
-  // What the receiver does when it is called the next time.
+  // Plans the receiver's reaction to the next call.
   void planReaction(std::uint8_t choice) {
     receiver_->during = [this, choice] {
       if ((choice & 1) != 0) setReceiver(false);
@@ -211,7 +211,8 @@ class StreamRun {
   bool listening_ = false;
 };
 
-// A whole run of the experiment on a device that sends a batch of reports every millisecond, and what must come of it.
+// A complete run of the experiment on a device that sends a batch of reports every millisecond, and the expected
+// result.
 class ExperimentRun {
  public:
   ExperimentRun(Input& input, bool careless) : images_(input.byte()), timeout_(input.byte() % 3) {
@@ -276,7 +277,7 @@ class ExperimentRun {
     }
   }
 
-  // A device that has left the loop delivers nothing of its batch any more.
+  // A device that was unscheduled does not deliver the rest of its batch.
   void expectBatch(const std::vector<Bytes>& images) {
     if (!batchRemoves_) {
       expectedImages_.insert(expectedImages_.end(), images.begin(), images.end());
@@ -312,11 +313,11 @@ class ExperimentRun {
   std::size_t images_;
   std::size_t timeout_;
   std::size_t batches_ = 0;
-  // Of the batch that is being planned.
+  // In the batch that is being planned.
   bool batchStops_ = false;
   bool batchRemoves_ = false;
   DiagnosticErrorPtr batchError_;
-  // Of the run.
+  // In the whole run.
   std::vector<Bytes> expectedImages_;
   DiagnosticErrorPtr expectedError_;
   bool ended_ = false;

@@ -1,18 +1,18 @@
-"""What came back from a step, and how a check looks at it."""
+"""The results of a step, and helpers for checks of them."""
 
 import json
 import re
 
 KERNEL_COMPLAINT = re.compile(r"BUG:|WARNING:|Oops|Call Trace|blocked for more than|general protection|Out of memory")
 
-# The address sanitizer says so, once, of a program that switches between stacks, as the simulated phone does. It found
-# nothing.
+# The address sanitizer prints this once for a program that switches stacks, like the simulated phone. It is not an
+# error.
 SANITIZER_REMARK = re.compile(r"^==\d+==WARNING: ASan doesn't fully support makecontext/swapcontext functions and may "
                               r"produce false positives in some cases!$", re.MULTILINE)
 
 
 class CheckFailed(Exception):
-    """A sentence that says what is not as expected."""
+    """A failed check, described by a sentence."""
 
 
 def expect(holds, sentence):
@@ -25,7 +25,7 @@ def expect_equal(what, got, wanted):
 
 
 class Arrived:
-    """The files of a step's parcel. Labels are those that the step's script gave to `run`."""
+    """The files of a step. Labels are those that the step's script passed to `run`."""
 
     def __init__(self, parcel):
         self._parcel = parcel
@@ -59,7 +59,7 @@ class Arrived:
         return int(text)
 
     def ran(self, label):
-        """The diagnostic or experiment of a JSON report; the only one."""
+        """The only diagnostic or experiment in a JSON report."""
         text = self.out(label)
         expect(text.strip(), f"{label} printed no report: {self.text(f'{label}.stderr').strip()}")
         document = json.loads(text)
@@ -67,14 +67,14 @@ class Arrived:
         return entry
 
     def passed(self, label):
-        """The same, when it passed."""
+        """Like ran(), and requires that it passed."""
         entry = self.ran(label)
         expect(entry["verdict"] == "pass", f"{label} ended in {entry['verdict']}: {failure_of(entry)}")
         expect_equal(f"the exit code of {label}", self.exit_code(label), 0)
         return entry
 
     def ended_in_error(self, label, domain, code, message=None):
-        """The chain of errors of a run that ended in an error: the plug-in's own and what lies under it."""
+        """The chain of errors of a run that ended in an error: the plug-in's error and its underlying errors."""
         entry = self.ran(label)
         expect_equal(f"the verdict of {label}", entry["verdict"], "error")
         expect_equal(f"the exit code of {label}", self.exit_code(label), 2)
@@ -85,7 +85,7 @@ class Arrived:
         return error
 
     def holds_in_general(self):
-        """What is expected of every step, whatever it does."""
+        """Checks that apply to every step."""
         expect_equal("the exit code of the script", self.text("exit").strip(), "0")
         expect_equal("the closing line", self._parcel.text("closed").strip(), f"closed {self.name}")
         expect_equal("what was left running", self.text("leftovers"), "")
@@ -97,7 +97,7 @@ class Arrived:
 
 
 def failure_of(entry):
-    """Why a diagnostic did not pass, in a line. Experiments judge no results."""
+    """A one-line reason why a diagnostic did not pass. Experiments judge no results."""
     if entry["error"]:
         return json.dumps(entry["error"])
     return "; ".join(f"{result['name']} is {result['value']}" for result in entry.get("measuredResults", [])
@@ -105,6 +105,6 @@ def failure_of(entry):
 
 
 def underlying(error):
-    """The error that lies under another one."""
+    """The underlying error of an error."""
     expect("underlying-error" in error, f"nothing lies under {error['message']!r}")
     return error["underlying-error"]

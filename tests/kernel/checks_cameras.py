@@ -4,7 +4,7 @@ from arrived import expect, expect_equal, underlying
 from kernel_trace import gaps_in, read_trace
 
 RATE = 30
-PORTS = {  # of data/bindings/vivid.json: the name in measurements and the device's bus info
+PORTS = {  # of data/bindings/vivid.json: the camera's name in measurements and the bus info of the device
     "BackWide": "platform:vivid-000",
     "BackTele": "platform:vivid-001",
     "BackSuperWide": "platform:vivid-002",
@@ -32,7 +32,7 @@ def counters_of(entry, camera):
 
 
 def expect_counters(entry, camera, **wanted):
-    """The counters that are named are as wanted, all others 0."""
+    """Checks that the given counters have these values and all others are 0."""
     counters = counters_of(entry, camera)
     expect(set(wanted) <= set(counters), f"{camera} has no counter {set(wanted) - set(counters)}")
     for name, count in counters.items():
@@ -61,7 +61,7 @@ def healthy_again(step):
 
 
 def as_the_kernel_counts(step, label, cameras):
-    """Every camera's counts are those of the buffers that were dequeued until they were read."""
+    """Checks that the counts of every camera equal the number of buffers dequeued until they were read."""
     entry = healthy_run(step, label, cameras, 3.015)
     trace = read_trace(step.text(f"{label}.trace"))
     minors = dict(line.split() for line in step.text(f"{label}.minors").splitlines())
@@ -100,12 +100,12 @@ def dropped_frames(step):
     expect_counters(some, "FrontInfrared")
     buffers = int(step.text("buffers"))
     expect(0 <= buffers - frames <= 1, f"the kernel counted {buffers} buffers, not {frames}")
-    step.ended_in_error("all", HOST, NO_ERROR_GIVEN)  # without any frame: no result, and no error of the plug-in's
+    step.ended_in_error("all", HOST, NO_ERROR_GIVEN)  # without any frame there is no result and no error of the plug-in
     healthy_again(step)
 
 
 def expect_not_controlled(step, label, code, words):
-    """The cameras could not be had; the diagnostic says why in its log."""
+    """Checks that the cameras were not available and that the diagnostic logged the reason."""
     step.ended_in_error(label, CAPTURE, 214, "Failed to synchronize cameras!")
     log = " ".join(line["text"] for line in step.ran(label)["log"])
     expect(f"{LINUX} code {code}:" in log and words in log, f"the log does not say why: {log}")
@@ -123,7 +123,7 @@ def refused_start(call):
 
 
 def disturbed(**counters):
-    """The camera stopped half a second after it had begun; the other one did not."""
+    """Checks that the camera stopped half a second after its start and that the other one did not."""
     def check(step):
         entry = step.passed("disturbed")
         expect_equal("the injection", step.exit_code("injection"), 0)
@@ -151,7 +151,7 @@ def unbind(step):
     for camera in BACK:
         expect(10 <= frames_of(entry, camera) <= 30, f"{camera} has {frames_of(entry, camera)} frames")
         expect_counters(entry, camera, DisconnectCount=1)
-    expect_not_controlled(step, "absent", NO_DEVICE, "there is none at all")
+    expect_not_controlled(step, "absent", NO_DEVICE, "there is none")
     below = underlying(step.ended_in_error("uncounted", CAPTURE, 210))
     expect_equal("the cause with an unreadable counter", (below["domain"], below["code"]), (LINUX, DEVICE_GONE))
     healthy_again(step)
@@ -193,7 +193,7 @@ def projector_killed(step):
 
 
 def refused_qbuf_streaming(step):
-    """One buffer could not be given back to the driver; the others go round."""
+    """One buffer could not be returned to the driver; the others circulate."""
     entry = step.passed("disturbed")
     expect_equal("the injection", step.exit_code("injection"), 0)
     expect_frames(entry, FRONT, 2.015)

@@ -1,4 +1,4 @@
-"""Checks of the steps that need no camera: the program itself, probing, report channels."""
+"""Checks of the steps without a camera: the program itself, probing, report channels."""
 
 import json
 

@@ -10,7 +10,7 @@ ACTIVE_IMAGES_ONLY = [{"id": 0xAB, "data": "ab01"}, {"id": 0xAC, "data": "ac01"}
 
 
 def device_of(step, label):
-    """What the only device says of itself."""
+    """The report of the only device."""
     expect_equal(f"the exit code of the device {label}", step.exit_code(label), 0)
     (device,) = json.loads(step.out(label).splitlines()[-1])["devices"]
     return device

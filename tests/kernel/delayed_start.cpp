@@ -1,5 +1,5 @@
-// Preloaded into a program, lets it start one camera late: VIDIOC_STREAMON of video capture on a device whose bus info
-// is DELAYED_BUS comes DELAYED_MILLISECONDS later than the program wanted it.
+// Preloaded into a program, delays the start of one camera: VIDIOC_STREAMON for video capture on the device with the
+// bus info DELAYED_BUS takes effect DELAYED_MILLISECONDS later.
 
 #include <linux/videodev2.h>
 

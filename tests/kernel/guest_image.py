@@ -1,4 +1,4 @@
-"""What a guest finds: busybox, the kernel's modules, the project as it is installed, the steps to run."""
+"""The contents of a guest: busybox, the kernel's modules, the installed project and the steps to run."""
 
 import json
 import os
@@ -11,10 +11,10 @@ from initramfs import Archive, add_program
 
 HERE = pathlib.Path(__file__).resolve().parent
 TARGETS = ("quazor_program", "camera_sensor_diagnostics", "sensor_images", "kernel_guest_programs")
-GUEST_PROGRAMS = "tests/kernel"  # in a build: the directory of the programs that only the rig uses
+GUEST_PROGRAMS = "tests/kernel"  # the build directory of the programs for the rig
 
-# Five cameras with one input each and a metadata node beside it. Their nodes are numbered in no order, since nothing may
-# depend on the numbers.
+# Five cameras with one input each and a metadata node. Their node numbers are not in order, because nothing may depend
+# on the numbers.
 CAMERAS = 5
 VIVID_OPTIONS = {
     "n_devs": [CAMERAS],
@@ -27,7 +27,7 @@ VIVID_OPTIONS = {
 
 
 class BuildProblem(Exception):
-    """A sentence that says why there is nothing to run."""
+    """The reason why there is nothing to run, as a sentence."""
 
 
 def checked(*command):
@@ -37,14 +37,14 @@ def checked(*command):
 
 
 def build(directory, *options):
-    """Configures a build where there is none, and builds what the guest needs."""
+    """Configures a build if there is none, and builds everything that the guest needs."""
     if not (directory / "build.ninja").is_file():
         checked("cmake", "-S", HERE.parent.parent, "-B", directory, "-G", "Ninja", *options)
     checked("cmake", "--build", directory, "--target", *TARGETS)
 
 
 def system_archive(kernel):
-    """What is the same for every run: busybox and the modules, as bytes."""
+    """The common part of all runs: busybox and the modules, as bytes."""
     archive = Archive()
     busybox = pathlib.Path(shutil.which("busybox"))
     archive.add_file("/bin/busybox", busybox)
@@ -63,7 +63,7 @@ def system_archive(kernel):
 
 
 def project_archive(directory):
-    """The project of a build as it is installed under /usr, the rig's own programs and the steps, as bytes."""
+    """The project of a build as installed under /usr, the rig's own programs and the steps, as bytes."""
     archive = Archive()
     with tempfile.TemporaryDirectory() as scratch:
         for component in ("program", "plugins"):
@@ -83,14 +83,14 @@ def project_archive(directory):
 
 
 def channels_of(scenario):
-    """The report channels of a simulated phone, a line GROUP/SUBGROUP/NAME for each."""
+    """The report channels of a simulated phone, one line GROUP/SUBGROUP/NAME each."""
     groups = json.loads(scenario.read_text())["reports"]
     return "".join(f"{group}/{subgroup}/{name}\n" for group, subgroups in groups.items()
                    for subgroup, names in subgroups.items() for name in names)
 
 
 def add_installed(archive, prefix):
-    """Programs, libraries and data of an installation; no documents."""
+    """Programs, libraries and data of an installation, without documents."""
     for folder in ("bin", "lib"):
         for file in sorted((prefix / folder).rglob("*")):
             if file.is_symlink():
@@ -101,14 +101,14 @@ def add_installed(archive, prefix):
 
 
 def plan_archive(steps):
-    """The names of the steps and how many seconds of guest time each has, in their order, as bytes."""
+    """The names of the steps in order and their time limits in seconds of guest time, as bytes."""
     archive = Archive()
     archive.add("/rig/plan", "".join(f"{step.name} {step.limit}\n" for step in steps).encode(), 0o644)
     return archive.bytes()
 
 
 def script_archive(name, text):
-    """A step's script that is made for this run, as bytes."""
+    """The script of a step that is generated for this run, as bytes."""
     archive = Archive()
     archive.add(f"/rig/steps/{name}", text.encode(), 0o644)
     return archive.bytes()

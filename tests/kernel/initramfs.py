@@ -1,4 +1,4 @@
-"""Makes an initial file system for a guest: an archive in the kernel's own form (cpio "newc"), written without root."""
+"""Builds an initial file system for a guest: a cpio archive in the kernel's format ("newc"), without being root."""
 
 import os
 import pathlib
@@ -11,22 +11,22 @@ TRAILER = "TRAILER!!!"
 
 
 class Archive:
-    """A cpio archive that is being made. Directories above a file come by themselves; all belongs to root."""
+    """A cpio archive under construction. Parent directories are added automatically; all files belong to root."""
 
     def __init__(self):
         self._entries = {}  # path without a leading "/": mode, content, device numbers
 
     def add(self, path, content, mode):
-        """A file. `path` is absolute in the guest. A second one of a path replaces the first."""
+        """Adds a file. `path` is absolute in the guest. A second file with the same path replaces the first."""
         self._directories_above(path)
         self._entries[path.strip("/")] = (stat.S_IFREG | mode, content, (0, 0))
 
     def add_file(self, path, source):
-        """A copy of a file, with its right to be executed."""
+        """Adds a copy of a file and keeps its executable bit."""
         self.add(path, source.read_bytes(), 0o755 if os.access(source, os.X_OK) else 0o644)
 
     def add_tree(self, path, source, suffix=""):
-        """Copies of all files under a directory whose names end in `suffix`."""
+        """Adds copies of all files below a directory whose names end in `suffix`."""
         for file in sorted(source.rglob("*" + suffix)):
             if file.is_file():
                 self.add_file(f"{path}/{file.relative_to(source)}", file)
@@ -43,7 +43,7 @@ class Archive:
         self._entries[path.strip("/")] = (stat.S_IFCHR | 0o600, b"", (major, minor))
 
     def bytes(self):
-        """The whole archive."""
+        """The complete archive."""
         entries = [*self._entries.items(), (TRAILER, (0, b"", (0, 0)))]
         return b"".join(self._entry(number, path, *what) for number, (path, what) in enumerate(entries, 1))
 
@@ -65,7 +65,7 @@ def padded(content):
 
 
 def libraries_of(program):
-    """The shared libraries that a program is started with, its loader among them, as paths on this machine."""
+    """The shared libraries of a program, including its loader, as paths on this machine."""
     listed = subprocess.run(["ldd", program], capture_output=True, text=True, check=True).stdout
     missing = re.findall(r"(\S+) => not found", listed)
     if missing:
@@ -74,8 +74,8 @@ def libraries_of(program):
 
 
 def add_program(archive, path, program):
-    """A program or plug-in, and the libraries of the system that it needs, where the loader looks for them."""
+    """Adds a program or plug-in and the system libraries that it needs, where the loader finds them."""
     archive.add_file(path, program)
     for library in libraries_of(program):
-        if not library.name.startswith("libquazor"):  # that is installed with the program
+        if not library.name.startswith("libquazor"):  # installed with the program
             archive.add_file(str(library), library.resolve())

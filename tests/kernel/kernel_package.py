@@ -1,7 +1,7 @@
-"""The distribution's own kernel: fetched as a package, never installed, kept in a cache.
+"""The distribution's kernel: downloaded as a package, never installed, and cached.
 
-Of a package the cache keeps the kernel in the form that boots fastest (vmlinux, not compressed) and the modules that
-the rig loads, in the order in which they can be loaded.
+From each package the cache keeps the kernel in the form that boots fastest (vmlinux, not compressed) and the modules
+that the rig loads, in loading order.
 """
 
 import dataclasses
@@ -13,30 +13,30 @@ import shutil
 import subprocess
 import tempfile
 
-META_PACKAGE = "linux-image-amd64"  # depends on the newest kernel's package, whose name holds the version
+META_PACKAGE = "linux-image-amd64"  # depends on the package of the newest kernel, whose name contains the version
 MODULES = ("hid-generic", "uhid", "bochs", "vivid")
 XZ_MAGIC = b"\xfd7zXZ\x00"
 
 
 class KernelProblem(Exception):
-    """A sentence that says why there is no kernel."""
+    """The reason why there is no kernel, as a sentence."""
 
 
 @dataclasses.dataclass(frozen=True)
 class Kernel:
     name: str  # of the package, with its version
     image: pathlib.Path
-    modules: tuple  # paths, each after those that it needs
+    modules: tuple  # paths, each after its dependencies
 
 
 def cache_directory(build):
-    """Where packages are kept: of the user, or else of the build."""
+    """The directory for packages: the user's cache, or else in the build."""
     home = os.environ.get("XDG_CACHE_HOME")
     return pathlib.Path(home) / "quazor-kernels" if home else build / "kernel-cache"
 
 
 def kernel_of(directory):
-    """The kernel in a directory of the cache, None when there is no whole one."""
+    """The kernel in a directory of the cache; None if the directory is incomplete."""
     order = directory / "modules.order"
     if not order.is_file():
         return None
@@ -45,7 +45,7 @@ def kernel_of(directory):
 
 
 def output_of(*command, **options):
-    """What a command prints; raises KernelProblem with its words when it fails."""
+    """The output of a command; raises KernelProblem with its error messages if it fails."""
     done = subprocess.run(command, capture_output=True, text=True, check=False, **options)
     if done.returncode != 0:
         raise KernelProblem(f"`{' '.join(map(str, command))}` failed: {(done.stderr or done.stdout).strip()}")
@@ -53,7 +53,7 @@ def output_of(*command, **options):
 
 
 def newest_package():
-    """The package of the newest kernel that the system's package lists know, as "name=version"; None without lists."""
+    """The package of the newest kernel in the system's package lists, as "name=version"; None without lists."""
     depends = subprocess.run(["apt-cache", "depends", META_PACKAGE], capture_output=True, text=True, check=False).stdout
     name = re.search(r"Depends: (linux-image-\S+)", depends)
     if name is None:
@@ -63,7 +63,7 @@ def newest_package():
 
 
 def unpacked_image(compressed):
-    """The kernel inside of a vmlinuz, whose payload is XZ and followed by more."""
+    """The kernel inside of a vmlinuz, whose payload is XZ data followed by other data."""
     content = compressed.read_bytes()
     start = content.find(XZ_MAGIC)
     if start < 0:
@@ -72,7 +72,7 @@ def unpacked_image(compressed):
 
 
 def modules_in_order(root, release):
-    """The files of MODULES and of what they need, in the order of loading."""
+    """The files of MODULES and of their dependencies, in loading order."""
     output_of("depmod", "-b", root, release)
     order = []
     for module in MODULES:
@@ -84,7 +84,7 @@ def modules_in_order(root, release):
 
 
 def extract(package, directory):
-    """Fills a directory of the cache from a package file. `modules.order` comes last, so that only a whole one counts."""
+    """Fills a directory of the cache from a package file. Writes `modules.order` last, as the mark of completeness."""
     with tempfile.TemporaryDirectory(dir=directory.parent) as scratch:
         root = pathlib.Path(scratch)
         output_of("dpkg-deb", "-x", package, root)
@@ -99,7 +99,7 @@ def extract(package, directory):
 
 
 def download(package, cache):
-    """Fetches a package file into the cache and fills the package's directory from it."""
+    """Downloads a package file into the cache and fills the package's directory from it."""
     with tempfile.TemporaryDirectory(dir=cache) as scratch:
         output_of("apt-get", "download", "-q", package, cwd=scratch)
         (file,) = pathlib.Path(scratch).glob("*.deb")
@@ -107,13 +107,13 @@ def download(package, cache):
 
 
 def newest_cached(cache):
-    """The kernel that came into the cache last, None when it is empty."""
+    """The kernel most recently added to the cache; None if the cache is empty."""
     kernels = filter(None, map(kernel_of, cache.iterdir()))
     return max(kernels, key=lambda kernel: kernel.image.stat().st_mtime, default=None)
 
 
 def find_kernel(cache, say):
-    """The newest kernel that can be had. What is in the cache is enough when nothing can be fetched; then that is said."""
+    """The newest available kernel. Falls back to the cache, with a message, if nothing can be downloaded."""
     cache.mkdir(parents=True, exist_ok=True)
     package = newest_package()
     if package is None and newest_cached(cache) is None:

@@ -1,4 +1,4 @@
-"""Reads what the kernel traced of a run: buffers that were dequeued, and writes of processes, in the order of time."""
+"""Reads the kernel's trace of a run: dequeued buffers and writes of processes, in order of time."""
 
 import dataclasses
 import re
@@ -9,11 +9,11 @@ EVENT = re.compile(r"^ *.+-\d+ +\[\d+\] \S+ +(?P<time>\d+\.\d+): (?:v4l2_dqbuf: 
 
 @dataclasses.dataclass(frozen=True)
 class Dequeued:
-    """A buffer that a process took from a node."""
+    """A buffer that a process dequeued from a node."""
 
     time: float  # in seconds
     minor: int  # of the node
-    timestamp: int  # that the driver gave the buffer, in nanoseconds
+    timestamp: int  # set by the driver, in nanoseconds
     sequence: int
 
 
@@ -23,8 +23,8 @@ class KernelTrace:
     writes: list  # times in seconds
 
     def end_of_silence(self):
-        """The first write after the longest time without any. A program that sleeps while cameras stream is silent, and
-        says so when it has looked what came of them."""
+        """The first write after the longest time without one. A program that sleeps while cameras stream writes
+        nothing, and writes again when it has read the results."""
         between = zip(self.writes, self.writes[1:])
         return max(between, key=lambda pair: pair[1] - pair[0])[1]
 
@@ -33,12 +33,12 @@ class KernelTrace:
 
 
 def gaps_in(buffers):
-    """How many sequence numbers are missing between those of a node's buffers."""
+    """The number of sequence numbers missing from the buffers of a node."""
     return sum(max(0, later.sequence - earlier.sequence - 1) for earlier, later in zip(buffers, buffers[1:]))
 
 
 def read_trace(text):
-    """The trace of a file as tracefs gives it."""
+    """Parses a trace file of tracefs."""
     dequeued, writes = [], []
     for event in EVENT.finditer(text):
         if event["minor"] is None:

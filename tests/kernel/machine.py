@@ -1,10 +1,10 @@
-"""A machine under emulation that boots a kernel, and what it sends back.
+"""An emulated machine that boots a kernel, and the data that it sends back.
 
-Guest time is counted in instructions (2 ns each) and waiting costs nothing: what happens in the guest does not depend
-on how busy this computer is, and a sleep of the guest takes no time here. That asks for one processor and one thread.
+Guest time is derived from the number of instructions (2 ns each) and waiting is skipped: the guest does not depend on
+the load of this computer, and a sleep of the guest takes no time here. That requires one processor and one thread.
 
-The guest's processor makes random numbers (rdrand). Without it the kernel's are slow for the first seconds, and vivid,
-which paints a line of noise before its first image, then takes longer for that than a frame may.
+The guest's processor provides random numbers (rdrand). Without it the kernel's are slow during the first seconds, and
+vivid, which draws a line of noise before its first image, then needs more than a frame's time for that.
 """
 
 import dataclasses
@@ -18,18 +18,18 @@ from parcels import ParcelReader
 MACHINE = ("-accel", "tcg,thread=single", "-cpu", "qemu64,+rdrand", "-smp", "1", "-icount", "shift=1,sleep=off",
            "-nodefaults", "-no-reboot", "-display", "none", "-vga", "none", "-device", "bochs-display")
 KERNEL_OPTIONS = "console=ttyS0 quiet panic=-1 printk.time=1"
-LOOK_INTERVAL = 0.05  # seconds between two looks at what has come
-PATIENCE = 10  # how much longer a machine may take than its processor time, on a computer that is busy
+LOOK_INTERVAL = 0.05  # seconds between two checks for new data
+PATIENCE = 10  # on a busy computer a machine may take this many times its processor time
 
 
 @dataclasses.dataclass
 class Boot:
-    """How a machine ended."""
+    """The outcome of a machine's run."""
 
     seconds: float  # of this computer's time
-    ended: bool  # by itself, within the time it had
-    damages: list  # of what it sent
-    console: pathlib.Path  # a file with all that it printed
+    ended: bool  # it ended by itself and in time
+    damages: list  # damage to the received data
+    console: pathlib.Path  # a file with the console output
 
 
 def command_of(kernel, initramfs, memory, sent):
@@ -38,14 +38,14 @@ def command_of(kernel, initramfs, memory, sent):
 
 
 def boot(command, directory, seconds, take):
-    """Runs a machine to its end, or kills it after so many seconds of processor time, or PATIENCE times as many of any.
+    """Runs a machine to its end, or kills it after so many seconds of processor time or PATIENCE times as many seconds.
 
-    The machine sends to the file `directory`/sent. `take` is called with each Parcel as it comes, on this thread.
+    The machine sends to the file `directory`/sent. Calls `take` on this thread with each Parcel that arrives.
     """
     console = directory / "console.log"
     reader = ParcelReader()
     began = time.monotonic()
-    (directory / "sent").write_bytes(b"")  # nothing of a run before this one may be read
+    (directory / "sent").write_bytes(b"")  # discards the data of an earlier run
     with open(console, "wb") as printed, open(directory / "sent", "rb") as sent:
         process = subprocess.Popen(command, stdin=subprocess.DEVNULL, stdout=printed, stderr=subprocess.STDOUT)
         try:
@@ -58,10 +58,10 @@ def boot(command, directory, seconds, take):
 
 
 def watch(process, sent, reader, seconds, take):
-    """Hands on what comes until the process has ended (true) or time is over (false)."""
+    """Passes on arriving data until the process has ended (True) or the time is over (False)."""
     deadline = time.monotonic() + seconds * PATIENCE
     while True:
-        over = process.poll() is not None  # before the last look, so that nothing is left unread
+        over = process.poll() is not None  # before the last read, so that no data is left unread
         for parcel in reader.feed(sent.read()):
             take(parcel)
         if over:
@@ -72,6 +72,6 @@ def watch(process, sent, reader, seconds, take):
 
 
 def processor_seconds(process):
-    """What a child has used so far; it may have ended, but nobody has waited for it."""
+    """The processor time of a child, which may have ended but must not have been waited for."""
     fields = pathlib.Path(f"/proc/{process}/stat").read_text().rpartition(")")[2].split()
     return (int(fields[11]) + int(fields[12])) / os.sysconf("SC_CLK_TCK")

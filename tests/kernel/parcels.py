@@ -1,9 +1,9 @@
-"""What a guest sends over its second serial port: parcels, each a header line and then as many bytes as the line says.
+"""The data that a guest sends over its second serial port: parcels, each a header line and as many bytes as it says.
 
     quazor-rig NAME SIZE MD5
 
-The bytes are a tar archive. Whatever does not fit (a line that is no header, bytes that are missing or changed) is a
-damage that is told; nothing that was damaged counts as arrived.
+The bytes are a tar archive. Everything else (a line that is not a header, missing or changed bytes) is reported as
+damage; a damaged parcel does not count as arrived.
 """
 
 import dataclasses
@@ -21,19 +21,19 @@ class Parcel:
     files: dict  # path within the archive: content
 
     def text(self, path):
-        """A file's text; empty when there is none."""
+        """The text of a file; empty if there is none."""
         return self.files.get(path, b"").decode("utf-8", errors="replace")
 
 
 class ParcelReader:
-    """Takes bytes as they come; gives whole parcels."""
+    """Accepts bytes in pieces and returns complete parcels."""
 
     def __init__(self):
         self._pending = b""
         self.damages = []
 
     def feed(self, content):
-        """The parcels that have become whole."""
+        """Returns the parcels that are now complete."""
         self._pending += content
         parcels = []
         while (end := self._pending.find(b"\n")) >= 0:
@@ -51,7 +51,7 @@ class ParcelReader:
         return parcels
 
     def finish(self):
-        """The port was closed: what is not whole is damaged."""
+        """The port was closed: an incomplete parcel is damaged."""
         if self._pending:
             self.damages.append(f"the last parcel is cut off: {self._pending[:80]!r}")
         self._pending = b""
@@ -68,7 +68,7 @@ class ParcelReader:
 
 
 def files_of(body):
-    """The files of a tar archive, by their paths without a leading "./"."""
+    """The files of a tar archive by path, without a leading "./"."""
     with tarfile.open(fileobj=io.BytesIO(body)) as archive:
         return {member.name.removeprefix("./"): archive.extractfile(member).read()
                 for member in archive.getmembers() if member.isfile()}

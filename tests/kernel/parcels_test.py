@@ -1,5 +1,5 @@
 #!/usr/bin/env python3
-"""Tests of parcels.py: what a guest sent arrives whole, or is told to be damaged."""
+"""Tests of parcels.py: data arrives complete or is reported as damaged."""
 
 import hashlib
 import io

@@ -1,6 +1,6 @@
-"""Boots a real kernel with the project in it, runs the steps, and says which passed. See README.md.
+"""Boots a real kernel with the project, runs the steps and prints which passed. See README.md.
 
-Steps are spread over boots, and as many boots run at once as this computer has processors.
+The steps are distributed over boots, and as many boots run at once as this computer has processors.
 """
 
 import argparse
@@ -23,7 +23,7 @@ ROOT = pathlib.Path(__file__).resolve().parent.parent.parent
 RELEASE = ("-DCMAKE_BUILD_TYPE=Release",)
 SANITIZED = ("--preset", "sanitized")
 MEMORY, SANITIZED_MEMORY = 512, 2048  # MiB
-BOOT_SECONDS = 100  # of processor time, until a machine counts as hanging
+BOOT_SECONDS = 100  # of processor time, before a machine counts as hung
 SANITIZED_SLOWNESS = 4
 
 output_lock = threading.Lock()
@@ -36,7 +36,7 @@ def say(text):
 
 @dataclasses.dataclass
 class Plan:
-    """One boot: what it is called, what is in it, what it runs, what has come of it."""
+    """One boot: its name, its contents, its steps and their results."""
 
     name: str
     steps: list
@@ -47,7 +47,7 @@ class Plan:
 
 
 def judge(step, arrived):
-    """What is wrong with a step, as a sentence; None when nothing is."""
+    """A sentence about what is wrong with a step; None if it passed."""
     try:
         arrived.holds_in_general()
         step.check(arrived)
@@ -59,7 +59,7 @@ def judge(step, arrived):
 
 
 def keep(arrived, directory):
-    """Writes what a step sent."""
+    """Writes the files that a step sent."""
     for file, content in arrived.files.items():
         path = directory / arrived.name / file
         path.parent.mkdir(parents=True, exist_ok=True)
@@ -71,7 +71,7 @@ def indented(text):
 
 
 def run_plan(plan, kernel, results):
-    """Runs a boot to its end and tells each step's outcome; what never came has failed."""
+    """Runs a boot to its end and reports the outcome of each step; a step that did not arrive has failed."""
     directory = results / plan.name
     shutil.rmtree(directory, ignore_errors=True)
     directory.mkdir(parents=True)
@@ -114,7 +114,7 @@ def run_plan(plan, kernel, results):
 
 
 def plans_of(steps, label, archives, memory, slowness):
-    """A plan for each boot that any of the steps is of."""
+    """One plan per boot that any of the steps needs."""
     plans = []
     for number in sorted({step.boot for step in steps}):
         chosen = [step for step in steps if step.boot == number]
@@ -125,7 +125,7 @@ def plans_of(steps, label, archives, memory, slowness):
 
 
 def run_plans(plans, kernel, results):
-    """Runs boots, several at once. Whether all steps of all passed."""
+    """Runs boots, several at once. Returns whether all of their steps passed."""
     with concurrent.futures.ThreadPoolExecutor(os.cpu_count()) as pool:
         for done in [pool.submit(run_plan, plan, kernel, results) for plan in plans]:
             done.result()
@@ -133,7 +133,7 @@ def run_plans(plans, kernel, results):
 
 
 def shell(command, directory, kernel):
-    """Runs one command in a guest with all devices, prints what it prints; its exit code."""
+    """Runs one command in a guest with all devices and prints its output; returns its exit code."""
     code = 1
 
     def take(parcel):

@@ -1,5 +1,5 @@
 #!/usr/bin/env python3
-"""Tests of the rig without a kernel: a machine is any program that writes parcels, and steps fail as they should."""
+"""Tests of the rig without a kernel: any program that writes parcels can be the machine; steps must be able to fail."""
 
 import contextlib
 import io
@@ -26,7 +26,7 @@ END = parcel("end", archive_of({}))
 
 
 def sent(name, **changes):
-    """The parcel of a step, whole but for some files; None leaves one out."""
+    """The parcel of a step with some files replaced; None omits a file."""
     files = {**WHOLE, "closed": f"closed {name}\n", **{file.replace("_", "."): text for file, text in changes.items()}}
     return parcel(name, archive_of({file: text for file, text in files.items() if text is not None}))
 
@@ -38,7 +38,7 @@ class RigTest(unittest.TestCase):
         self.results = pathlib.Path(scratch.name)
 
     def run_machine(self, content, steps=("one",), check=lambda step: None, seconds=10.0, after="true"):
-        """Runs a plan on a machine that sends `content`; what was printed and what failed."""
+        """Runs a plan on a machine that sends `content`; returns the output and the failed steps."""
         source = self.results / "content"
         source.write_bytes(content)
         plan = rig.Plan("boot-1", [Step(name, "something", check) for name in steps], b"", 1, seconds)

@@ -1,4 +1,4 @@
-"""The steps, in the order in which they run: a script of guest/steps and a check of what it left."""
+"""The steps in order: a script in guest/steps and a check of its results."""
 
 import dataclasses
 import typing
@@ -13,8 +13,8 @@ class Step:
     name: str  # of guest/steps/NAME.sh
     shows: str
     check: typing.Callable  # takes an Arrived; raises CheckFailed
-    boot: int = 1  # in which of the boots it runs
-    limit: int = 60  # seconds of guest time until it counts as hanging
+    boot: int = 1  # the boot in which it runs
+    limit: int = 60  # seconds of guest time before it counts as hung
     soak: bool = False  # with sanitizers only when it is named: it takes minutes there
 
 

@@ -23,8 +23,8 @@ constexpr std::uint8_t kStreamingMode = 0xAC;
 constexpr std::uint8_t kOn = 1;
 constexpr std::uint16_t kRefused = EIO;
 
-// Usage 0x24 of the vendors' page 0xFF00, with input report 0x76 of 791 bytes behind its ID and feature reports 0xAB
-// and 0xAC of one.
+// Usage 0x24 of the vendor page 0xFF00, with input report 0x76 of 791 bytes after its ID and feature reports 0xAB and
+// 0xAC of one byte.
 constexpr std::array<std::uint8_t, 40> kDescriptor{
     0x06, 0x00, 0xFF,                                      // usage page 0xFF00
     0x09, 0x24, 0xA1, 0x01,                                // usage 0x24, application collection
@@ -34,7 +34,7 @@ constexpr std::array<std::uint8_t, 40> kDescriptor{
     0x85, 0xAC, 0x09, 0xAC, 0x95, 0x01, 0xB1, 0x02,        // report 0xAC: another
     0xC0};
 
-// An event is written up to the end of what it has.
+// An event is written up to the end of its used part.
 constexpr std::size_t kPayload = offsetof(uhid_event, u);
 
 }  // namespace

@@ -1,4 +1,4 @@
-// UhidSensor: the device's side of a display sensor, for a kernel that takes HID devices from programs (/dev/uhid).
+// UhidSensor: the device side of a display sensor, for a kernel that accepts HID devices from programs (/dev/uhid).
 #pragma once
 
 #include "backends/linux/system/file_descriptor.h"
@@ -21,46 +21,46 @@ namespace quazor {
 struct UhidSensorConfig {
   std::string name = "Display Sensor";
   double rate = 60;          // input reports per second
-  std::size_t length = 792;  // of each, in bytes; behind an image of 792 bytes there are zeros
+  std::size_t length = 792;  // of each, in bytes; an image of 792 bytes is followed by zeros
   HidImages images;
-  std::set<std::uint8_t> refuses;             // feature reports that are answered with an error
-  std::set<std::uint8_t> ignores;             // feature reports that are never answered
-  bool alwaysStreams = false;                 // whatever its feature reports say
-  std::optional<std::uint64_t> stopsAfter;    // this many reports it sends no more
-  std::optional<std::uint64_t> removedAfter;  // this many reports it is removed, one period after the last
+  std::set<std::uint8_t> refuses;             // feature reports that are rejected with an error
+  std::set<std::uint8_t> ignores;             // feature reports that get no response
+  bool alwaysStreams = false;                 // regardless of its feature reports
+  std::optional<std::uint64_t> stopsAfter;    // stops sending after this many reports
+  std::optional<std::uint64_t> removedAfter;  // is removed after this many reports, one period after the last
 };
 
-// A feature report that arrived, in the order of their arrival.
+// A feature report that arrived, in order of arrival.
 struct UhidFeatureReport {
   std::uint8_t id = 0;
-  Bytes data;  // as the kernel gave it, the ID first
+  Bytes data;  // as received from the kernel, including the ID
 };
 
-// Sends image reports while it is open and the feature reports 0xAB and 0xAC both have the value 1: the first one
-// period after that has come to hold. Settings stay when it is closed. Times are of one clock, from any moment.
+// Sends image reports while it is open and the feature reports 0xAB and 0xAC both have the value 1: the first one a
+// period after both conditions are met. Settings persist while it is closed. All times are from the same clock.
 //
 // Thread: one.
 class UhidSensor {
  public:
   using Time = std::chrono::nanoseconds;
 
-  // Takes /dev/uhid, opened for reading and writing. Call create() next.
+  // Takes an open /dev/uhid for reading and writing. Call create() next.
   UhidSensor(FileDescriptor uhid, UhidSensorConfig traits);
   UhidSensor(const UhidSensor&) = delete;
   UhidSensor& operator=(const UhidSensor&) = delete;
 
-  // Asks the kernel for the device, which makes its node some milliseconds later: isStarted() tells. False, and errno,
-  // when the kernel refuses.
+  // Requests the device from the kernel, which creates its node some milliseconds later: see isStarted(). Returns false
+  // and sets errno if the kernel refuses.
   bool create();
-  // Takes it away; the descriptor stays. Without effect when it is gone.
+  // Removes the device; the descriptor stays open. No effect if it was already removed.
   void destroy();
 
   int descriptor() const { return uhid_.get(); }
-  // Reads an event of the kernel, of which there must be one, and answers it. False, and errno, when that fails.
+  // Reads a pending event of the kernel and responds to it. Returns false and sets errno on failure.
   bool handleEvent(Time now);
-  // When something is to be done of itself, or nothing.
+  // When act() must be called next; nothing: never.
   std::optional<Time> due() const;
-  // Does what is due. False, and errno, when the kernel refuses a report.
+  // Performs the due actions. Returns false and sets errno if the kernel refuses a report.
   bool act(Time now);
 
   bool isStarted() const { return started_; }
@@ -82,7 +82,7 @@ class UhidSensor {
   bool started_ = false;
   bool gone_ = false;
   bool open_ = false;
-  std::map<std::uint8_t, std::uint8_t> values_;  // of the feature reports
+  std::map<std::uint8_t, std::uint8_t> values_;  // by feature report
   bool streaming_ = false;
   Time next_{0};
   std::uint64_t sent_ = 0;

@@ -24,7 +24,7 @@ using namespace std::chrono_literals;
 using ::testing::ElementsAre;
 using ::testing::SizeIs;
 
-// A sensor on connected sockets; this end is the kernel.
+// A sensor on connected sockets; the test plays the kernel.
 class UhidDeviceTest : public ::testing::Test {
  protected:
   void make(UhidSensorConfig traits) {
@@ -42,7 +42,7 @@ class UhidDeviceTest : public ::testing::Test {
     traits.rate = 100;
     make(traits);
   }
-  // What the sensor wrote next, or nothing.
+  // The next event that the sensor wrote, or nothing.
   std::optional<uhid_event> received() {
     uhid_event event{};
     size_ = ::recv(kernel_.get(), &event, sizeof event, 0);
@@ -57,7 +57,7 @@ class UhidDeviceTest : public ::testing::Test {
     event.type = type;
     tell(event, now);
   }
-  // Sends a feature report; the error of the answer, or nothing without an answer.
+  // Sends a feature report and returns the error in the response, or nothing without a response.
   std::optional<int> set(std::uint8_t id, std::uint8_t value, std::uint8_t type = UHID_FEATURE_REPORT,
                          std::uint16_t size = 2, UhidSensor::Time now = 0ns) {
     uhid_event event{};
@@ -80,7 +80,7 @@ class UhidDeviceTest : public ::testing::Test {
     EXPECT_EQ(set(0xAB, 1, UHID_FEATURE_REPORT, 2, now), 0);
     EXPECT_EQ(set(0xAC, 1, UHID_FEATURE_REPORT, 2, now), 0);
   }
-  // The frame ID of the report that was sent next, or nothing.
+  // The frame ID of the next report, or nothing.
   std::optional<std::uint32_t> frame() {
     const auto event = received();
     if (!event) return std::nullopt;

@@ -1,9 +1,9 @@
-// Makes display sensors out of /dev/uhid, and tells what they did.
+// Creates display sensors with /dev/uhid and reports their activity.
 //
-// Prints "started NUMBER" for each device when the kernel has it, and at the end one line of JSON:
+// Prints "started NUMBER" for each device when the kernel has created it, and at the end one line of JSON:
 //   {"devices": [{"sent": 181, "features": [{"id": 171, "data": "ab01"}, ...], "removed": false}, ...]}
-// Ends after --seconds, when all devices are removed, or on SIGTERM or SIGINT: with 0, or with 1 after a sentence on
-// standard error.
+// Ends after --seconds, when all devices are removed, or on SIGTERM or SIGINT. The exit code is 0, or 1 after a message
+// on standard error.
 #include "tests/kernel/uhid_device.h"
 
 #include "contract/message_format.h"
@@ -64,7 +64,7 @@ void tell(const Sensors& sensors) {
   std::cout << "]}" << std::endl;
 }
 
-// The signals that end this program, as a descriptor.
+// A descriptor for the signals that end this program.
 FileDescriptor endingSignals() {
   sigset_t signals;
   sigemptyset(&signals);
@@ -74,7 +74,7 @@ FileDescriptor endingSignals() {
   return FileDescriptor(::signalfd(-1, &signals, SFD_CLOEXEC));
 }
 
-// How long to sleep: to the nearest of what is due and the end.
+// The time until the next due action or the end.
 timespec timeLeft(const Sensors& sensors, Time end) {
   Time nearest = end;
   for (const auto& sensor : sensors) nearest = std::min(nearest, sensor->due().value_or(end));

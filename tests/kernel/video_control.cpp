@@ -1,12 +1,12 @@
-// Looks at and changes what a video node has, from a script.
+// Shows and changes the state of a video node, for scripts.
 //
 //   video_control BUS KIND path               the node's path
 //   video_control BUS KIND get CONTROL        the control's value
 //   video_control BUS KIND set CONTROL VALUE  sets it; a button is pressed, whatever the value
 //   video_control BUS KIND free               sets the node's format to what it is: fails while somebody holds buffers
 //
-// BUS is the bus info of the device, KIND "capture" or "metadata", CONTROL the name that the driver gives. Ends with 0,
-// or with 1 after a sentence on standard error.
+// BUS is the bus info of the device, KIND "capture" or "metadata", CONTROL the driver's name for the control. The exit
+// code is 0, or 1 after a message on standard error.
 
 #include <linux/videodev2.h>
 
@@ -43,7 +43,7 @@ class Node {
 
   const std::filesystem::path& path() const { return path_; }
 
-  // Whether the driver knows the request.
+  // Returns whether the driver supports the request.
   template <typename Argument>
   bool asks(unsigned long request, Argument& argument) const {
     return ioctl(descriptor_, request, &argument) == 0;

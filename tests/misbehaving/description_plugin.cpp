@@ -11,7 +11,7 @@ namespace quazor::misbehaving {
 
 namespace {
 
-// The file that the environment names is made by the first process that comes here.
+// The first process that calls this creates the file named in the environment; the next one crashes.
 void crashInTheNextProcess() {
   const int file = ::open(std::getenv("MISBEHAVIOUR_STATE"), O_CREAT | O_EXCL | O_CLOEXEC, 0600);
   if (file < 0) crash();

@@ -1,4 +1,4 @@
-// Diagnostics that use descriptors that are not theirs.
+// Diagnostics that use descriptors they do not own.
 #include "tests/misbehaving/misbehaviour.h"
 
 #include <sys/syscall.h>
@@ -31,11 +31,11 @@ void writeToAll(int first, std::string_view text) {
   for (int descriptor = first; descriptor < kMaxDescriptors; ++descriptor) writeAll(descriptor, text);
 }
 
-// Every octet, with and without an end of a line.
+// Writes all bytes, with and without a line end.
 void writeGarbageToOutput() {
-  std::string octets;
-  for (int i = 0; i < 256; ++i) octets += static_cast<char>(i);
-  writeAll(STDOUT_FILENO, octets);
+  std::string bytes;
+  for (int i = 0; i < 256; ++i) bytes += static_cast<char>(i);
+  writeAll(STDOUT_FILENO, bytes);
   writeAll(STDERR_FILENO, "\xFF\xFE\nhalf a line");
 }
 

@@ -1,4 +1,4 @@
-// Diagnostics that end their process, or never end.
+// Diagnostics that end their process or never return.
 #include "tests/misbehaving/misbehaviour.h"
 
 #include <pthread.h>
@@ -30,7 +30,7 @@ void terminateOnAnotherThread() {
   std::thread([] { std::terminate(); }).join();
 }
 
-// So deep that no stack holds it, unless `wanted` is small.
+// Overflows the stack unless `wanted` is small.
 std::size_t recurse(const volatile std::size_t& wanted, std::size_t depth) {
   volatile char frame[4096] = {};
   frame[depth % sizeof frame] = 1;
@@ -47,7 +47,7 @@ void allocateForEver() {
   for (;;) blocks.push_back(std::make_unique<char[]>(kBlock));
 }
 
-// Leaves nothing for whoever comes next, down to blocks of a few bytes.
+// Exhausts the memory, down to blocks of a few bytes.
 void allocateAndKeep() {
   for (std::size_t size = kBlock; size >= sizeof(void*); size /= 2) {
     while (::operator new(size, std::nothrow) != nullptr) {

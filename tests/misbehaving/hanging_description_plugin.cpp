@@ -1,4 +1,4 @@
-// A plug-in whose diagnostic never ends its description.
+// A plug-in whose diagnostic never returns its description.
 #include "tests/misbehaving/misbehaviour.h"
 
 namespace quazor::misbehaving {

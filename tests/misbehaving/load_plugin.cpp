@@ -1,4 +1,4 @@
-// Plug-ins that misbehave when they are loaded, each in its own way: MISBEHAVIOUR is the name of a function here.
+// Plug-ins that misbehave when they are loaded. MISBEHAVIOUR is the name of a function in this file.
 #include "tests/misbehaving/misbehaviour.h"
 
 #include <fcntl.h>
@@ -15,7 +15,7 @@ namespace {
 
 [[maybe_unused]] void throwException() { throw std::runtime_error("the lamp is out"); }
 
-// The file that the environment names has as many octets as there were processes that loaded this.
+// The size in bytes of the file named in the environment is the number of processes that loaded this plug-in.
 [[maybe_unused]] void crashAfterTheFirstTime() {
   const int file = ::open(std::getenv("MISBEHAVIOUR_STATE"), O_CREAT | O_APPEND | O_WRONLY | O_CLOEXEC, 0600);
   if (::write(file, "x", 1) == 1 && ::lseek(file, 0, SEEK_END) > 1) crash();

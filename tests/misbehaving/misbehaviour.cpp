@@ -108,7 +108,7 @@ void sleepForEver() {
 }
 
 void crash() {
-  // The compiler must not know the address.
+  // Hides the address from the compiler.
   volatile std::uintptr_t nowhere = 8;
   *reinterpret_cast<volatile int*>(nowhere) = 1;
 }

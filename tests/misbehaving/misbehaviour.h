@@ -1,4 +1,4 @@
-// Misbehaviour: what a diagnostic of a test's plug-in does wrong, and when.
+// Misbehaviour: how and when the diagnostic of a test plug-in misbehaves.
 #pragma once
 
 #include "contract/results.h"
@@ -7,32 +7,32 @@
 
 namespace quazor::misbehaving {
 
-// Every member is optional: a diagnostic that has none logs a line, measures "Answer" and passes.
+// Every member is optional: a diagnostic without any logs a line, measures "Answer" and passes.
 struct Misbehaviour {
   void (*inDescription)() = nullptr;  // of the experiment
   void (*inSetup)() = nullptr;
   void (*inRun)() = nullptr;
   void (*inTeardown)() = nullptr;
-  void (*inDestructor)() = nullptr;  // of the experiment, when its result has been told
+  void (*inDestructor)() = nullptr;  // of the experiment, after its result was sent
   void (*inAnalysis)() = nullptr;
 
-  // Fill the results, which are empty, in place of the usual.
+  // Fill the empty results instead of the default functions.
   void (*measure)(QZExperimentResult& result) = nullptr;
   void (*find)(QZAnalysisResult& result) = nullptr;
 };
 
-// Registers the diagnostic `name`, with the experiment `name`Experiment and the analysis `name`Analysis. The experiment
-// logs "`name` begins" in its setup, before anything else.
+// Registers the diagnostic `name` with the experiment `name`Experiment and the analysis `name`Analysis. The experiment
+// logs "`name` begins" first in its setup.
 void addDiagnostic(std::string_view name, const Misbehaviour& misbehaviour);
 
-// What several diagnostics do.
+// Used by several diagnostics.
 [[noreturn]] void sleepForEver();
 void crash();
 
-// Each registers the diagnostics of one kind.
-void addEndings();      // that end their process, or never end
-void addDescriptors();  // that use descriptors that are not theirs
-void addProcesses();    // that make processes and change their own
-void addResults();      // whose results and log are out of measure
+// Each registers one group of diagnostics:
+void addEndings();      // that end their process or never return
+void addDescriptors();  // that use descriptors they do not own
+void addProcesses();    // that create processes or modify their own
+void addResults();      // with excessive results and logs
 
 }  // namespace quazor::misbehaving

@@ -1,4 +1,4 @@
-// Diagnostics that make processes, and that change their own.
+// Diagnostics that create processes or modify their own.
 #include "tests/misbehaving/misbehaviour.h"
 
 #include "contract/log_channel.h"
@@ -19,7 +19,7 @@ void forkOneThatStays() {
   if (::fork() == 0) sleepForEver();
 }
 
-// Its parent has ended, and its session is another.
+// The daemon's parent has ended, and it has its own session.
 void forkDaemon() {
   if (const pid_t child = ::fork(); child != 0) {
     ::waitpid(child, nullptr, 0);
@@ -32,7 +32,7 @@ void forkDaemon() {
   sleepForEver();
 }
 
-// Both return to the host, the copy first.
+// Both processes return to the host, the copy first.
 void forkIntoHost() {
   const pid_t child = ::fork();
   if (child == 0) {
@@ -42,7 +42,8 @@ void forkIntoHost() {
   }
 }
 
-// What is made when the group is ended: a few generations, each ended after it has made the next.
+// Several generations of processes, created while the group is being killed; each is killed after it has created the
+// next.
 void forkGenerations() {
   if (::fork() != 0) return;
   for (int generation = 0; generation < 50; ++generation) {
@@ -53,7 +54,7 @@ void forkGenerations() {
   sleepForEver();
 }
 
-// Signals to the group that the host made for it do not reach it.
+// Leaves the process group that the host created, so signals to the group do not reach this process.
 void leaveGroupAndHang() {
   ::setpgid(0, ::getpgid(::getppid()));
   sleepForEver();

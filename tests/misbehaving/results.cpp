@@ -1,4 +1,4 @@
-// Diagnostics whose results and log are out of measure.
+// Diagnostics with excessive results and logs.
 #include "tests/misbehaving/misbehaviour.h"
 
 #include "contract/diagnostic_contract.h"
@@ -50,12 +50,12 @@ void logForEver() {
   for (;;) logDefault("and on");
 }
 
-// Threads of it log when everything has ended.
+// Its threads log after everything has ended.
 void logOnThreads() {
   for (int i = 0; i < 4; ++i) std::thread(logForEver).detach();
 }
 
-// Experiments that have a parameter "count": how many; a million if it is not set. Their result has the measurement
+// Experiments with a parameter "count" for the number of items, by default a million. Their result has the measurement
 // "Count".
 class ExperimentOfMany : public QZExperiment {
  public:
@@ -99,7 +99,7 @@ class ManyMeasurements final : public ExperimentOfMany {
   }
 };
 
-// Of the depth "count".
+// A value with a nesting depth of "count".
 class DeepValue final : public ExperimentOfMany {
   void make(std::uint64_t count, QZExperimentResult& result) override {
     Value value("the innermost");
@@ -112,7 +112,7 @@ class ManyResults final : public ExperimentOfMany {
   void make(std::uint64_t /*count*/, QZExperimentResult& /*result*/) override {}
 };
 
-// Finds one result, or "Count" of them.
+// Returns one result, or "Count" results.
 class AnalysisOfMany final : public QZAnalysis {
  public:
   explicit AnalysisOfMany(bool findsMany) : findsMany_(findsMany) {}

@@ -1,4 +1,4 @@
-// A plug-in whose one diagnostic passes, and tells its surroundings: they must not depend on what ran before it.
+// A plug-in with one diagnostic that passes and reports its environment, which must not depend on earlier runs.
 #include "contract/diagnostic_contract.h"
 #include "contract/lab.h"
 #include "contract/log_channel.h"
@@ -20,7 +20,7 @@ namespace quazor::misbehaving {
 
 namespace {
 
-// The lines of proc(5), /proc/self/status, that begin with Sig or Threads, but for the signals that are pending.
+// The lines of proc(5), /proc/self/status, that begin with Sig or Threads, except for pending signals.
 std::string processStatus() {
   std::ifstream file("/proc/self/status");
   std::string text;

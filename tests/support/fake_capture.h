@@ -1,4 +1,4 @@
-// A scripted capture service for camera synchronisation, whose calls a transcript holds.
+// A scripted capture service for camera synchronisation; a transcript records its calls.
 #pragma once
 
 #include "diagnostics/camera_sync/camera_sync_experiment.h"
@@ -17,7 +17,7 @@
 
 namespace quazor {
 
-// The end of a run whose cameras could not be synchronised.
+// The trace at the end of a run whose cameras could not be synchronised.
 inline constexpr std::string_view kNotSynchronized =
     "returned nothing\n"
     "error QZCapturePlugInErrorDomain code 214: Failed to synchronize cameras!\n";
@@ -27,15 +27,15 @@ inline const std::string kTelePort(port_type::BackFacingTelephotoCamera);
 inline const std::string kSuperPort(port_type::BackFacingSuperWideCamera);
 inline const std::string kSidePort = "SideFacingCamera";  // has no camera name
 
-// A service looks at what the place for its error holds no more than anybody else; but an error of an earlier call in
-// it would be told as this one's when this one has none.
+// Checks that the error variable of a call is empty. If it contained the error of an earlier call, the caller would
+// report that error for a call that fails without one.
 inline void expectFreshPlace(const DiagnosticErrorPtr* error) {
   if (error != nullptr) {
     EXPECT_EQ(*error, nullptr) << "a call was given a place that still holds an error";
   }
 }
 
-// Lets no time pass and tells how long it was asked to sleep.
+// A clock that records sleeps and does not advance.
 class FakeClock final : public Clock {
  public:
   explicit FakeClock(RunTranscript& transcript) : transcript_(transcript) {}
@@ -55,7 +55,7 @@ inline Value statusEntry(Value offset, Value frames) {
                     {std::string(capture_key::FrameCount), std::move(frames)}};
 }
 
-// A device with one group of the three back cameras, the wide one its master; a test changes what it is about.
+// A device with one group of the three back cameras and the wide one as master; tests modify it.
 class FakeCaptureTest : public testing::Test {
  protected:
   FakeCaptureTest() {
@@ -102,7 +102,7 @@ class FakeCaptureTest : public testing::Test {
 
   RunTranscript transcript;
   const CaptureScript script = [this](const ScriptedCall& call) {
-    if (call.object == "service") return call.operation == "createPlugIn";  // a camera sync run makes its own plug-in
+    if (call.object == "service") return call.operation == "createPlugIn";  // a camera sync run creates its own plug-in
     expectFreshPlace(call.error);
     if (call.object != "plug-in") {
       transcript.addCall("Fake." + std::string(call.operation), call.object, call.detail, call.succeeds);
@@ -121,13 +121,13 @@ class FakeCaptureTest : public testing::Test {
   Dictionary status_;
 };
 
-// What stands behind the first occurrence of `line`, with it; the whole text when it is not there.
+// The text from the first occurrence of `line`; the whole text if there is none.
 inline std::string from(const std::string& text, std::string_view line) {
   const std::size_t at = text.find(line);
   return at == std::string::npos ? text : text.substr(at);
 }
 
-// What stands from the first occurrence of `first` up to the next one of `end`.
+// The text from the first occurrence of `first` up to the next one of `end`.
 inline std::string between(const std::string& text, std::string_view first, std::string_view end) {
   const std::string rest = from(text, first);
   return rest.substr(0, rest.find(end));

@@ -20,9 +20,9 @@ void copyText(Field& field, const std::string& text) {
 
 bool isMetadata(const FakeNode& node) { return (node.capabilities & V4L2_CAP_META_CAPTURE) != 0; }
 
-const FakeSize* sizeOf(const FakeNode& node, std::uint32_t code, std::uint32_t width, std::uint32_t height) {
+const FakeSize* sizeOf(const FakeNode& node, std::uint32_t fourcc, std::uint32_t width, std::uint32_t height) {
   for (const FakeFormat& format : node.formats) {
-    if (format.code != code) continue;
+    if (format.fourcc != fourcc) continue;
     for (const FakeSize& size : format.sizes) {
       if (size.width == width && size.height == height) return &size;
     }
@@ -205,7 +205,7 @@ void FakeV4l2Api::close(int descriptor) {
   FakeNode& node = nodes_.at(descriptors_.at(descriptor));
   descriptors_.erase(descriptor);
   if (node.lockedBy == descriptor) node.lockedBy = -1;
-  if (node.owner == descriptor) {  // as the kernel does it; what is mapped stays in use
+  if (node.owner == descriptor) {  // like the kernel; mapped buffers remain in use
     node.owner = -1;
     node.streaming = false;
     if (node.mapped == 0) node.buffers = 0;
@@ -236,7 +236,7 @@ int FakeV4l2Api::ioctl(int descriptor, unsigned long request, void* argument) {
   return -result;
 }
 
-// Returns 0 or the error number.
+// Returns 0 or an error number.
 int FakeV4l2Api::call(FakeNode& node, int descriptor, unsigned long request, void* argument) {
   switch (request) {
     case VIDIOC_QUERYCAP: {
@@ -323,13 +323,13 @@ int FakeV4l2Api::enumerate(const FakeNode& node, unsigned long request, void* ar
   if (request == VIDIOC_ENUM_FMT) {
     auto& description = *static_cast<v4l2_fmtdesc*>(argument);
     if (description.index >= node.formats.size()) return EINVAL;
-    description.pixelformat = node.formats[description.index].code;
-    copyText(description.description, node.formats[description.index].text);
+    description.pixelformat = node.formats[description.index].fourcc;
+    copyText(description.description, node.formats[description.index].description);
     return 0;
   }
   if (request == VIDIOC_ENUM_FRAMESIZES) {
     auto& entry = *static_cast<v4l2_frmsizeenum*>(argument);
-    const auto format = std::ranges::find(node.formats, entry.pixel_format, &FakeFormat::code);
+    const auto format = std::ranges::find(node.formats, entry.pixel_format, &FakeFormat::fourcc);
     if (format == node.formats.end() || entry.index >= format->sizes.size()) return EINVAL;
     entry.type = V4L2_FRMSIZE_TYPE_DISCRETE;
     entry.discrete = {format->sizes[entry.index].width, format->sizes[entry.index].height};
@@ -353,8 +353,8 @@ int FakeV4l2Api::enumerate(const FakeNode& node, unsigned long request, void* ar
   query.type = control->type;
   query.flags = control->flags;
   copyText(query.name, control->name);
-  query.minimum = control->lowest;
-  query.maximum = control->highest;
+  query.minimum = control->minimum;
+  query.maximum = control->maximum;
   query.default_value = control->value;
   return 0;
 }

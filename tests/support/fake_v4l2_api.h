@@ -1,7 +1,7 @@
-// A made-up video driver, and a machine that has its nodes, for the tests of the capture service.
+// A fake video driver, and a machine with its nodes, for the tests of the capture service.
 //
-// It does what real drivers were seen to do: takes a frame rate that it does not have and silently gives another, keeps
-// a queue busy until every buffer is unmapped, gives fewer buffers than were asked for, stamps frames in the future.
+// Behaves like real drivers were observed to: it silently replaces a frame rate that it does not support, keeps
+// a queue busy until every buffer is unmapped, provides fewer buffers than requested, and stamps frames in the future.
 #pragma once
 
 #include "backends/linux/video/v4l2_api.h"
@@ -26,8 +26,8 @@ namespace quazor {
 struct FakeControl {
   std::uint32_t id = 0;
   std::string name;
-  std::int64_t lowest = 0;
-  std::int64_t highest = 255;
+  std::int64_t minimum = 0;
+  std::int64_t maximum = 255;
   std::int64_t value = 0;
   std::uint32_t type = V4L2_CTRL_TYPE_INTEGER;
   std::uint32_t flags = 0;
@@ -40,12 +40,12 @@ struct FakeSize {
 };
 
 struct FakeFormat {
-  std::uint32_t code = 0;
-  std::string text;
+  std::uint32_t fourcc = 0;
+  std::string description;
   std::vector<FakeSize> sizes;
 };
 
-// One node. What is above the line is for tests to fill; below it, what the driver made of it.
+// One node. Tests set the members above the blank line; the driver sets those below.
 struct FakeNode {
   std::string path;
   std::string driver = "fake";
@@ -57,9 +57,9 @@ struct FakeNode {
   std::uint32_t mostBuffers = 32;
   std::uint32_t timestampFlags = V4L2_BUF_FLAG_TIMESTAMP_MONOTONIC;
   std::uint32_t firstSequence = 0;
-  std::chrono::nanoseconds stampedAhead{0};  // by how much a frame's stamp lies behind its delivery
-  std::string metadataNode;                  // its path: gets a buffer with each frame of this one
-  std::vector<std::uint8_t> metadata;        // what that buffer holds
+  std::chrono::nanoseconds stampedAhead{0};  // the difference between a frame's time stamp and its delivery
+  std::string metadataNode;                  // its path: receives a buffer with each frame of this node
+  std::vector<std::uint8_t> metadata;        // the content of that buffer
   bool delivers = true;
   int openProblem = 0;  // an error number
 
@@ -77,7 +77,7 @@ struct FakeNode {
   std::deque<v4l2_buffer> filled;
   std::uint32_t sequence = 0;
   std::chrono::nanoseconds nextFrame{0};
-  std::vector<std::string> history;  // controls that were set, STREAMON and STREAMOFF
+  std::vector<std::string> history;  // the controls that were set, STREAMON and STREAMOFF
 };
 
 // Thread: any.
@@ -86,39 +86,39 @@ class FakeV4l2Api : public V4l2Api {
   FakeV4l2Api();
   ~FakeV4l2Api() override;
 
-  // The machine's device folders, which exist for as long as this does.
+  // The device directories of the machine, which exist during the lifetime of this object.
   const DeviceRoots& roots() const { return roots_; }
-  // Adds /dev/video<number>; returns its path.
+  // Adds /dev/video<number> and returns its path.
   std::string add(int number, FakeNode node);
-  // Runs `look` on the node while nothing changes.
+  // Calls `look` with the node while nothing changes.
   template <class Look>
   auto with(const std::string& path, Look&& look) {
     const std::lock_guard lock(mutex_);
     return look(nodes_.at(path));
   }
 
-  // The request fails `times` times on that node, after `after` times at which it did not.
+  // Makes the request fail `times` times on that node, after `after` successful calls.
   void failNext(const std::string& path, unsigned long request, int number, int times = 1, int after = 0);
-  // Called, on its thread, before each call to a driver; to be set while none is made.
+  // Called before each call of a driver, on the same thread. Set it while there are no calls.
   std::function<void(unsigned long request)> beforeCall;
   int failNextMaps = 0;      // with ENOMEM
   int makeEventProblem = 0;  // an error number
   int guardProblem = 0;      // an error number
 
-  // Fills one buffer now. A frame for which there is no buffer is lost, and its number with it.
+  // Fills one buffer now. Without a queued buffer the frame is lost, and its number is skipped.
   void produce(const std::string& path, std::uint32_t flags = 0);
-  // Frame numbers go on as if so many frames had been.
+  // Skips that many frame numbers.
   void skip(const std::string& path, std::uint32_t frames);
-  // The device is removed. It is back when its last descriptor is closed.
+  // Removes the device. It is present again after its last descriptor was closed.
   void disconnect(const std::string& path);
-  // The stream fails for good until it is stopped.
+  // Makes the stream fail permanently until it is stopped.
   void breakStream(const std::string& path);
-  // Lets the time pass: cameras that stream deliver at their rate, and what is delivered is taken.
+  // Advances the time: streaming cameras deliver frames at their rate, and all of them are dequeued.
   void passTime(std::chrono::nanoseconds duration);
-  // Waits until everything that was delivered has been taken and all who poll wait. False after some seconds.
+  // Waits until all delivered buffers have been dequeued and all pollers wait. Returns false after some seconds.
   bool settle();
 
-  // Nothing open, mapped, requested, streaming, locked or guarded.
+  // True if nothing is open, mapped, requested, streaming, locked or guarded.
   bool isIdle();
   int guards();
   std::uint64_t pollsWithoutEffect() const { return pollsWithoutEffect_; }
@@ -173,15 +173,15 @@ class FakeV4l2Api : public V4l2Api {
   int lastDescriptor_ = 99;
   int polling_ = 0;
   int guards_ = 0;
-  std::uint64_t pollsWithoutEffect_ = 0;  // that returned at once for a descriptor that is dead
+  std::uint64_t pollsWithoutEffect_ = 0;  // calls that returned at once because of an unusable descriptor
 };
 
-// Four characters of a pixel format.
+// The four characters of a pixel format.
 constexpr std::uint32_t fakeCode(char a, char b, char c, char d) { return v4l2_fourcc(a, b, c, d); }
 
 // A camera with the formats YUYV and GREY: 640x360 at 5, 25, 30 and 40 per second, and 640x480 at up to 25.
 FakeNode fakeCamera(const std::string& bus);
-// A metadata node at the same place.
+// A metadata node at the same bus.
 FakeNode fakeMetadata(const std::string& bus);
 
 }  // namespace quazor

@@ -12,7 +12,7 @@ namespace {
 
 constexpr int kSafetyBit = 0x2000;
 
-// What the module attaches to every frame, in its order.
+// The metadata that the module attaches to every frame, in its order.
 Dictionary metadata(int lightSource, int hardwareEvents) {
   return Dictionary{{"MetaDataProjectorMode", 0},
                     {std::string(capture_key::InfraredLightSource), lightSource},
@@ -57,7 +57,7 @@ std::optional<Value> metadataOf(FrameKind kind) {
   return std::nullopt;
 }
 
-// Every channel at the same count.
+// All channels have the same count.
 class HandMadeSnapshot final : public ReportSnapshot {
  public:
   HandMadeSnapshot(std::shared_ptr<const HandMadeReports::Descriptions> channels, std::uint64_t count)
@@ -208,7 +208,7 @@ std::shared_ptr<const ReportChannelSet> HandMadeReports::reportWithOnlySimpleCha
 }
 
 HandMadeReports::Descriptions handMadeChannels(std::size_t count) {
-  // All in one place, which every pointer to one of them keeps.
+  // One allocation that the pointers to all descriptions share.
   const auto descriptions = std::make_shared<std::vector<ReportChannelDescription>>();
   for (std::size_t i = 0; i < count; ++i) {
     const std::string name = "Channel " + std::to_string(i);

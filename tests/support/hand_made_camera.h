@@ -1,4 +1,4 @@
-// A depth camera and its report channels made by hand: a test pushes every frame itself.
+// A hand-written depth camera and its report channels: the test delivers every frame itself.
 #pragma once
 
 #include "platform/capture_service.h"
@@ -20,13 +20,13 @@
 
 namespace quazor {
 
-// What a frame shows and carries.
+// The image and metadata of a frame.
 enum class FrameKind {
   kLit,
-  kUnlit,                   // dark for no known reason
+  kUnlit,                   // dark for an unknown reason
   kUnlitForSafety,          // dark because the module kept its projector off
-  kWithoutMetadata,         // nothing is attached
-  kWithWrongMetadata,       // what is attached is no dictionary
+  kWithoutMetadata,         // without an attachment
+  kWithWrongMetadata,       // the attachment is not a dictionary
   kWithIncompleteMetadata,  // a number is missing
 };
 inline constexpr std::array kFrameKinds{FrameKind::kLit,
@@ -37,7 +37,7 @@ inline constexpr std::array kFrameKinds{FrameKind::kLit,
                                         FrameKind::kWithIncompleteMetadata};
 std::string_view nameOf(FrameKind kind);
 
-// A buffer that belongs to whoever made it and counts the references that others take. Any thread.
+// A buffer that its creator owns; it counts the references that others take. Any thread.
 class HandMadeBuffer final : public PixelBuffer {
  public:
   explicit HandMadeBuffer(FrameKind kind = FrameKind::kLit) : kind_(kind) {}
@@ -46,43 +46,43 @@ class HandMadeBuffer final : public PixelBuffer {
   void release() override { references_.fetch_sub(1); }
   std::optional<Value> attachment(std::string_view key) const override;
 
-  // How many references have been taken and not given back.
+  // The number of references not yet released.
   int references() const { return references_.load(); }
-  // Makes it a new frame without references. REQUIRES: nobody uses it.
+  // Turns it into a new frame without references. REQUIRES: the buffer is not in use.
   void renew(FrameKind kind);
 
-  // Called by attachment() before it answers, unless it is empty.
+  // Called by attachment() before it returns, unless empty.
   std::function<void()> onRead;
 
  private:
-  std::atomic<FrameKind> kind_;  // whoever renews it may know that nobody uses it, and still not have met them
+  std::atomic<FrameKind> kind_;  // atomic, because renew() may not be synchronised with earlier users
   std::atomic<int> references_{0};
 };
 
-// The stream of the front infrared camera. It takes every property, and frames and events from its test.
+// The stream of the front infrared camera. It accepts every property; its test delivers frames and events.
 class HandMadeStream final : public CaptureStream {
  public:
   HandMadeStream();
 
-  // Before the stream is used: what it answers.
-  bool stops = true;  // a stop that is refused leaves the stream running
+  // Results of its calls; set them before the stream is used.
+  bool stops = true;  // false: stop() fails and the stream keeps running
   std::optional<Value> errorCounters;
-  // Before the stream is used: called, unless it is empty, at the beginning of a start, of a reading of the error
-  // counters and of a stop ("start", "get ErrorCounters", "stop"), and at the end of a stop ("stopped"). May block.
+  // Called, unless empty, at the beginning of a start, of reading the error counters and of a stop ("start", "get
+  // ErrorCounters", "stop"), and at the end of a stop ("stopped"). May block. Set it before the stream is used.
   std::function<void(std::string_view call)> onCall;
 
   std::string description() const override { return "stream"; }
   std::optional<Value> valueForProperty(std::string_view key, DiagnosticErrorPtr* error) override;
   bool setValue(const Value& value, std::string_view key, DiagnosticErrorPtr* error) override;
   bool start(DiagnosticErrorPtr* error) override;
-  // Waits for the handlers that are running.
+  // Waits for running handlers.
   bool stop(DiagnosticErrorPtr* error) override;
 
-  // Hands a frame or an event to its handler. False, and nothing is done, when the stream does not run. Any thread.
+  // Passes a frame or an event to its handler. Returns false without an effect if the stream does not run. Any thread.
   bool deliver(PixelBuffer& buffer, MediaTime time);
   bool deliverEvent(std::int32_t event, MediaTime time);
 
-  // The handler that was set last. Any thread, after it has been set.
+  // The handler that was set last. Any thread, after it was set.
   const PixelBufferHandler& frameHandler() const { return *frames_; }
 
  private:
@@ -94,16 +94,16 @@ class HandMadeStream final : public CaptureStream {
   std::mutex mutex_;
   std::condition_variable left_;
   bool running_ = false;  // guarded by mutex_
-  int handlers_ = 0;      // that are running; guarded by mutex_
+  int handlers_ = 0;      // the number of running handlers; guarded by mutex_
 };
 
-// The error counters that a HandMadeStream answers unless told otherwise: all six, from I2C 1 to projector 6.
+// The default error counters of a HandMadeStream: all six, from I2C 1 to projector 6.
 const Dictionary& handMadeErrorCounters();
 
-// A capture service, plug-in and device with the one stream.
+// A capture service, plug-in and device with only this stream.
 std::shared_ptr<CaptureService> makeHandMadeCapture(std::shared_ptr<HandMadeStream> stream);
 
-// Report channels whose every counter goes up by `growth` from one snapshot to the next. Any thread.
+// Report channels whose counters all increase by `growth` between two snapshots. Any thread.
 class HandMadeReports final : public ReportFacility {
  public:
   using Descriptions = std::vector<std::shared_ptr<const ReportChannelDescription>>;

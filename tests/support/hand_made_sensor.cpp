@@ -49,7 +49,7 @@ class HandMadeRunLoop::Source final : public RunLoopSource {
 
   void signal() override { signalled_ = true; }
   bool isSignalled() const { return signalled_; }
-  // Calls the handler when the source was signalled since the last time.
+  // Calls the handler if the source was signalled.
   bool handle() {
     if (!std::exchange(signalled_, false)) return false;
     handler_();
@@ -170,7 +170,7 @@ void HandMadeRunLoop::tell(RunLoopActivities activity, std::string_view mode) {
   }
 }
 
-// What is to be done at one time is done in one wait, so that its sources are handled in one round.
+// Performs all actions for one time in one wait, so that their sources are handled in one round.
 void HandMadeRunLoop::waitUntil(std::chrono::nanoseconds deadline) {
   if (actions_.empty() || actions_.begin()->first > deadline) {
     now_ = deadline;
@@ -268,7 +268,7 @@ void HandMadeHidDevice::deliverError(DiagnosticErrorPtr error) {
   (*receiver)(0, {}, currentError_);
 }
 
-// One object that is all the services; a sensor stands behind it.
+// One object that implements all services for a sensor.
 class HandMadeSensor::Services final : public HidService,
                                        public FramebufferService,
                                        public RunLoops,

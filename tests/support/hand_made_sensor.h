@@ -1,4 +1,4 @@
-// A display, its sensor and a run loop made by hand: a test says what is there, what is refused and what comes when.
+// A hand-written display, its sensor and a run loop: a test determines what exists, which calls fail, and all events.
 #pragma once
 
 #include "platform/platform.h"
@@ -19,22 +19,22 @@
 
 namespace quazor {
 
-// Is told of every platform call in the words of RunTranscript::addCall; one that is empty is told nothing.
+// Called for every platform call, with the arguments of RunTranscript::addCall; may be empty.
 using CallRecorder =
     std::function<void(std::string_view operation, std::string_view object, std::string_view detail, bool succeeded)>;
 
-// A loop with a time of its own, which passes only while the loop waits. What it waits for is told to it beforehand.
+// A loop with its own time, which advances only while the loop waits. Tests schedule the events in advance.
 class HandMadeRunLoop final : public RunLoop {
  public:
   explicit HandMadeRunLoop(CallRecorder record) : record_(std::move(record)) {}
 
-  // Does something when the loop waits at that time or later; equal times in the order of the calls.
+  // Calls `action` when the loop waits at that time or later; actions for equal times run in the order of the calls.
   void at(std::chrono::nanoseconds time, std::function<void()> action) { actions_.emplace(time, std::move(action)); }
   std::chrono::nanoseconds now() const { return now_; }
-  // How many are added.
+  // The number of added sources.
   std::size_t sources() const { return sources_.size(); }
   std::size_t observers() const { return observers_.size(); }
-  // The observer that was made last, as long as somebody holds it.
+  // The observer that was created last, if it still exists.
   const std::weak_ptr<RunLoopObserver>& lastObserver() const { return lastObserver_; }
 
   std::shared_ptr<RunLoopSource> makeSource(std::function<void()> handler) override;
@@ -52,7 +52,7 @@ class HandMadeRunLoop final : public RunLoop {
   class Source;
   class Observer;
   template <class T>
-  using Added = std::vector<std::pair<std::shared_ptr<T>, std::string>>;  // with the mode
+  using Added = std::vector<std::pair<std::shared_ptr<T>, std::string>>;  // with its mode
 
   RunLoopResult runRounds(std::string_view mode, std::chrono::nanoseconds deadline, bool returnAfterSourceHandled);
   bool handleSources(std::string_view mode);
@@ -68,25 +68,25 @@ class HandMadeRunLoop final : public RunLoop {
   bool stopped_ = false;
 };
 
-// A device that takes everything but what it is told to refuse.
+// A device that accepts everything except what it is told to refuse.
 class HandMadeHidDevice final : public HidDevice {
  public:
   explicit HandMadeHidDevice(CallRecorder record) : record_(std::move(record)) {}
 
-  // Before it is used: what it answers.
+  // Results of its calls; set them before it is used.
   bool opens = true;
   std::set<std::uint8_t> refusedReports;  // IDs of feature reports
-  DiagnosticErrorPtr ownError;            // what a refused call gives; null for nothing
-  // A careless device calls its receiver for as long as there is one, scheduled and open or not.
+  DiagnosticErrorPtr ownError;            // the error of a refused call; null: none
+  // A careless device calls its receiver at any time, even if it is not scheduled or not open.
   bool careless = false;
-  // Called, unless it is empty, when a feature report has been taken.
+  // Called after a feature report was accepted, unless empty.
   std::function<void(std::uint8_t reportID)> onFeatureReport;
 
   bool isOpen() const { return open_; }
   bool isScheduled() const { return loop_ != nullptr; }
   bool hasReceiver() const { return receiver_ != nullptr; }
 
-  // A report that waits for the loop, and one that comes at once; an error in place of a report.
+  // Send a report through the loop; deliver a report at once; deliver an error instead of a report.
   void send(std::uint8_t reportID, Bytes data) { enqueue({reportID, std::move(data), nullptr}); }
   void sendError(DiagnosticErrorPtr error) { enqueue({0, {}, std::move(error)}); }
   void deliver(std::uint8_t reportID, std::span<const std::uint8_t> data);
@@ -116,30 +116,30 @@ class HandMadeHidDevice final : public HidDevice {
 
   CallRecorder record_;
   bool open_ = false;
-  std::shared_ptr<InputReportCallback> receiver_;  // shared, so that it outlives its own removal
+  std::shared_ptr<InputReportCallback> receiver_;  // shared, because it must outlive its own removal
   RunLoop* loop_ = nullptr;
   std::shared_ptr<RunLoopSource> source_;
   std::deque<Event> events_;
-  DiagnosticErrorPtr currentError_;  // that is being delivered; given up when the device is closed
+  DiagnosticErrorPtr currentError_;  // the error that is being delivered; released when the device is closed
 };
 
-// All the services that the sensor image experiment uses. What is changed here counts for the calls after it.
+// All services for the sensor image experiment. Changes affect later calls.
 class HandMadeSensor {
  public:
   explicit HandMadeSensor(CallRecorder record);
 
-  // Its services borrow the sensor, which must outlive them.
+  // The services borrow the sensor, which must outlive them.
   Platform platform();
 
   bool hasDisplay = true;
   bool hasRegistryService = true;
-  std::optional<Value> displayProperty;  // "DSPLY Debug Info"; at first that of a powered display
+  std::optional<Value> displayProperty;  // "DSPLY Debug Info"; initially that of a powered display
   bool hasHidManager = true;
   bool hasRunLoop = true;
   HandMadeRunLoop loop;
   std::shared_ptr<HandMadeHidDevice> device;
-  std::vector<std::shared_ptr<HidDevice>> matchingDevices;  // at first the one device
-  std::vector<Dictionary> matching;                         // what was last looked for
+  std::vector<std::shared_ptr<HidDevice>> matchingDevices;  // initially the one device
+  std::vector<Dictionary> matching;                         // the last search
 
  private:
   class Services;
@@ -147,11 +147,11 @@ class HandMadeSensor {
   CallRecorder record_;
 };
 
-// What the framebuffer's driver publishes when the panel's power is `power`.
+// The display property for a panel whose power state is `power`.
 Value displayPropertyOf(Value power);
 
-// An image report of that frame ID: sample i of channel I is i - 24, of channel Q 1000 i, the temperature 36.6 and the
-// timestamp 33 times the frame ID. What is not read is 0xEE.
+// An image report with that frame ID: sample i is i - 24 for channel I and 1000 i for channel Q, the temperature is
+// 36.6 and the timestamp 33 times the frame ID. Unused bytes are 0xEE.
 Bytes imageReport(std::uint32_t frameID);
 
 }  // namespace quazor

@@ -29,7 +29,7 @@ class TranscriptLog final : public LogBackend {
   std::shared_ptr<std::vector<std::string>> lines_;
 };
 
-// How an operation reads: OBJECT VERB DETAIL.
+// The format of an operation: OBJECT VERB DETAIL.
 struct Wording {
   std::string_view operation;  // without its interface
   std::string_view verb;
@@ -45,7 +45,7 @@ constexpr Wording kWordings[] = {
     {"setValue", "set"},
 };
 
-// What an object that is the only one of its interface is called.
+// The names of objects that are the only ones of their interface.
 constexpr Wording kOnlyObjects[] = {
     {"CaptureService", "service"},
     {"CapturePlugIn", "plug-in"},

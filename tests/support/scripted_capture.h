@@ -1,4 +1,4 @@
-// A capture service that does what a test says: for what no healthy phone would do.
+// A scripted capture service, for behaviour that no healthy phone has.
 #pragma once
 
 #include "contract/message_format.h"
@@ -15,18 +15,18 @@
 namespace quazor {
 
 struct ScriptedCall {
-  std::string_view object;     // "service", "plug-in", or the id of a device, a group or a stream
+  std::string_view object;     // "service", "plug-in", or the ID of a device, a group or a stream
   std::string_view operation;  // "setValue"
-  std::string detail;          // the key of a property, KEY = VALUE of what is set, or a list of streams
-  bool succeeds = true;        // what comes of the call unless the script says otherwise
+  std::string detail;          // the key of a property, KEY = VALUE for a setter, or a list of streams
+  bool succeeds = true;        // the result of the call unless the script changes it
   DiagnosticErrorPtr* error = nullptr;
 };
 
-// Decides whether a call succeeds, before it has any effect, and stores the call's error. An empty one lets every call
-// succeed that can.
+// Decides whether a call succeeds, before it has any effect, and stores the call's error. Without a script all possible
+// calls succeed.
 using CaptureScript = std::function<bool(const ScriptedCall& call)>;
 
-// Who asks the script. Thread: one at a time.
+// Base class of the objects that consult the script. Thread: one at a time.
 class Scripted {
  public:
   Scripted(std::string id, CaptureScript script) : id_(std::move(id)), script_(std::move(script)) {}
@@ -41,7 +41,7 @@ class Scripted {
   const CaptureScript script_;
 };
 
-// Holds whatever properties it is given; refuses to set those that it is told to refuse. Thread: one at a time.
+// Stores all properties that it is given, except refused ones. Thread: one at a time.
 template <class Interface>
 class ScriptedObject : public Interface {
  public:
@@ -61,7 +61,7 @@ class ScriptedObject : public Interface {
   }
 
   Dictionary properties;
-  std::set<std::string> refused;  // keys of properties, "start" and "stop"
+  std::set<std::string> refused;  // property keys, "start" and "stop"
 
  protected:
   bool ask(std::string_view operation, std::string detail, bool succeeds, DiagnosticErrorPtr* error) const {
@@ -137,7 +137,7 @@ class ScriptedPlugIn final : public CapturePlugIn {
   const Scripted scripted_;
 };
 
-// Gives a new plug-in with the device on every call. Thread: one at a time.
+// Returns a new plug-in with the device in every call. Thread: one at a time.
 class ScriptedCapture final : public CaptureService {
  public:
   explicit ScriptedCapture(std::shared_ptr<CaptureDevice> onlyDevice, CaptureScript script = {})
@@ -146,7 +146,7 @@ class ScriptedCapture final : public CaptureService {
   std::shared_ptr<CapturePlugIn> createPlugIn() override { return make("createPlugIn"); }
   std::shared_ptr<CapturePlugIn> defaultPlugIn() override { return make("defaultPlugIn"); }
 
-  std::shared_ptr<CaptureDevice> device;  // of the plug-ins to come
+  std::shared_ptr<CaptureDevice> device;  // for future plug-ins
   std::weak_ptr<CapturePlugIn> lastPlugIn;
 
  private:

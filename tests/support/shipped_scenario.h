@@ -1,4 +1,4 @@
-// The simulated phones that are installed with the program, for tests.
+// The installed scenarios, for tests.
 #pragma once
 
 #include "backends/simulated/scenario/scenario.h"
@@ -7,7 +7,7 @@
 
 namespace quazor {
 
-// The scenario in data/scenarios/NAME.json. Throws InputError when it cannot be read. Any thread.
+// Reads data/scenarios/NAME.json. Throws InputError if it cannot be read. Any thread.
 Scenario shippedScenario(const std::string& name);
 
 }  // namespace quazor

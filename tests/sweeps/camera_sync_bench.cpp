@@ -25,7 +25,7 @@ Camera camera(std::string id, std::string_view port, std::uint64_t firstFrameOff
   return camera;
 }
 
-// Where the line begins for the nth time; the test fails when it does not.
+// The offset of the nth occurrence of the line; the test fails if there is none.
 std::size_t findLine(std::string_view text, std::string_view line, std::uint64_t occurrence) {
   const std::string wanted = std::string(line) + '\n';
   std::size_t at = 0;

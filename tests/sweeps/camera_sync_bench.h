@@ -1,4 +1,4 @@
-// A simulated phone to run camera synchronisation on, and what healthy runs on it look like.
+// A simulated phone for camera synchronisation, and the traces of healthy runs on it.
 #pragma once
 
 #include "backends/faults/fault.h"
@@ -17,18 +17,18 @@ namespace quazor {
 
 enum class Side { kBack, kFront };
 
-// Three back and two front cameras, a group for each side. Frame offsets in the order of the groups are 0, 1, 2 and
-// 0, 3; every camera counts its own error.
+// Three back and two front cameras, with one group per side. The frame offsets in group order are 0, 1, 2 and 0, 3;
+// every camera counts a different error.
 Scenario cameraSyncScenario();
-// The same, but no group supports SlaveConfigurationByPortType.
+// The same scenario without support for SlaveConfigurationByPortType.
 Scenario withoutMasterConfiguration(Scenario scenario);
-// A camera of the scenario, to change it.
+// A camera of the scenario, for modification.
 Camera& cameraOf(Scenario& scenario, std::string_view id);
 
 // A run of 2 s on a new phone.
 struct BenchRun {
-  std::string told;  // as runAndTell() tells it
-  // How often the fault has fired; 0 when there was none.
+  std::string told;  // in the format of runAndTell()
+  // The number of times the fault has fired; 0 if there was none.
   std::uint64_t fired = 0;
 };
 BenchRun runOnBench(Side side, const Scenario& scenario, const std::optional<Fault>& fault, ErrorPlace place);
@@ -39,7 +39,7 @@ extern const char* const kHealthyFrontRun;
 // The back run on the phone without the master configuration.
 extern const char* const kHealthyBackRunWithoutMasterConfiguration;
 
-// A call of the run: the nth one of the operation, on that object, for that property; nothing is any.
+// A call of the run: the nth call of the operation, on that object and for that property; nothing matches any.
 struct CallOfRun {
   std::string operation;
   std::optional<std::string> object = {};
@@ -47,32 +47,32 @@ struct CallOfRun {
   std::uint64_t occurrence = 1;
 };
 
-// Operations that fault rows name often.
+// Frequent operations in fault rows.
 inline constexpr const char* kReadStream = "CaptureStream.valueForProperty";
 inline constexpr const char* kSetStream = "CaptureStream.setValue";
 
-// A call that fails, and all that comes of it.
+// A failing call and its consequences.
 struct FaultRow {
   const char* name;
   CallOfRun call;
-  // What is told from the call on. Up to there the run is the healthy one. {error} stands for the text of the call's
-  // error, {cause} for the end of an error's chain that it makes.
+  // The trace from the call on; before it the run equals the healthy one. {error} stands for the text of the call's
+  // error, {cause} for the part of an error chain that it causes.
   std::string told;
-  // The line from which on the run is the healthy one again; empty when the failure ends it.
+  // The line from which on the run equals the healthy one again; empty if the failure ends it.
   std::string_view resumesAt = {};
 };
 
 inline std::string nameOf(const testing::TestParamInfo<FaultRow>& row) { return row.param.name; }
 void PrintTo(const FaultRow& row, std::ostream* out);
 
-// Makes the row's call fail with an error of its own and with none, each with and without the caller's place for an
-// error, and compares the runs.
+// Makes the row's call fail with and without an error of its own, each with and without an error variable of the
+// caller, and compares the runs.
 void expectToldWithFault(const FaultRow& row, Side side, const Scenario& scenario, std::string_view healthyRun);
 
-// Compares a run without a fault, with and without the caller's place for an error.
+// Compares a run without faults, with and without an error variable of the caller.
 void expectTold(std::string_view expected, Side side, const Scenario& scenario);
 
-// The healthy run up to the given line, without it, followed by `rest`: for scenarios that go wrong by themselves.
+// The trace of the healthy run before the given line, followed by `rest`: for scenarios that fail without a fault.
 std::string healthyUpTo(std::string_view healthyRun, std::string_view line, std::string_view rest);
 
 }  // namespace quazor

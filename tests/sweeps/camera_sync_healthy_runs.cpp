@@ -1,4 +1,4 @@
-// What a healthy run does, call by call and word by word.
+// The complete traces of healthy runs.
 #include "tests/sweeps/camera_sync_bench.h"
 
 namespace quazor {

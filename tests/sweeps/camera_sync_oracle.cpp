@@ -21,13 +21,13 @@ std::string cameraName(const std::string& port) {
   return names.at(port);
 }
 
-// What an error of the experiment's own says, with the error that caused it.
+// The text of an error of the experiment and the error that caused it.
 std::string ownError(int code, const std::string& message, const std::string& cause = kNone) {
   return "QZCapturePlugInErrorDomain code " + std::to_string(code) + ": " + message +
          (cause == kNone ? "" : ", caused by " + cause);
 }
 
-// One run, step by step. Each step says whether the run goes on.
+// A run, step by step. Each step returns whether the run continues.
 class Run {
  public:
   Run(const Phone& phone, const Request& request, const Failures& failures)
@@ -50,8 +50,8 @@ class Run {
   }
 
  private:
-  // The next call: whether it succeeds. `refusal` is why the phone itself would refuse it; empty when it would not.
-  // Leaves the text of the call's error in cause_.
+  // The next call; returns whether it succeeds. `refusal` is the reason why the phone itself would reject the call;
+  // empty if it would not. Stores the text of the call's error in cause_.
   bool call(const std::string& line, const std::string& refusal = "") {
     const auto failure = failures_.find(++calls_);
     const bool fails = failure != failures_.end();
@@ -211,7 +211,7 @@ class Run {
     return true;
   }
 
-  // No stream is stopped that does not run, and none is given back that does: the phone refuses both.
+  // The phone rejects stopping a stream that does not run, and releasing control of one that runs.
   bool stop(std::size_t position) {
     const std::size_t index = selected_[position];
     const bool stopped = call(camera(position).id + " stop", runs_[index] ? "" : "not running");
@@ -222,8 +222,8 @@ class Run {
     std::string refusal;
     for (std::size_t i = selected_.size(); i > 0; --i) {
       if (runs_[selected_[i - 1]]) {
-        refusal =
-            "SimulatedCaptureErrorDomain code 10: " + camera(i - 1).id + " is running; stop it before giving it back.";
+        refusal = "SimulatedCaptureErrorDomain code 10: " + camera(i - 1).id +
+                  " is running; stop it before releasing control.";
       }
     }
     return call("device relinquish control " + selectedIds(), refusal);
@@ -254,7 +254,7 @@ class Run {
     return true;
   }
 
-  // Every frame of the master comes at its full rate; a slave lacks as many as come before its first.
+  // The master delivers every frame at its full rate; a slave lacks the frames before its first one.
   bool measureStream(std::size_t position) {
     const std::string& port = request_.ports[position];
     if (!call(camera(position).id + " get ErrorCounters")) {
@@ -280,12 +280,12 @@ class Run {
   std::size_t calls_ = 0;
   std::string lines_;
   std::string cause_;  // of the last call
-  std::string error_;  // of the run; empty for none
+  std::string error_;  // of the run; empty if there is none
 
   const PhoneGroup* group_ = nullptr;
-  std::vector<std::size_t> selected_;  // positions of cameras, in the order of the ports
-  std::vector<std::size_t> slaves_;    // positions of ports
-  std::vector<bool> runs_;             // by the position of the camera
+  std::vector<std::size_t> selected_;  // indexes of cameras, in the order of the ports
+  std::vector<std::size_t> slaves_;    // indexes of ports
+  std::vector<bool> runs_;             // by index of the camera
   std::string measurements_;
   std::string counters_;
 };

@@ -1,6 +1,6 @@
-// A second opinion on camera synchronisation: what a run must do and say, worked out from numbers and strings alone.
+// An oracle for camera synchronisation: predicts the trace of a run from numbers and strings.
 //
-// Nothing here knows the experiment, the platform or the simulated phone.
+// It does not use the experiment, the platform or the simulated phone.
 #pragma once
 
 #include <cstddef>
@@ -16,13 +16,13 @@ struct PhoneCamera {
   std::string id;
   std::string port;
   std::uint64_t firstFrameOffset = 0;
-  std::string errorCounters;  // their text
+  std::string errorCounters;  // as text
 };
 
 struct PhoneGroup {
   std::string id;
-  std::vector<std::size_t> cameras;  // positions in Phone::cameras
-  std::size_t master = 0;            // likewise
+  std::vector<std::size_t> cameras;  // indexes of Phone::cameras
+  std::size_t master = 0;            // the same
   bool masterConfiguration = true;
 };
 
@@ -31,7 +31,7 @@ struct Phone {
   std::vector<PhoneGroup> groups;
 };
 
-// What a run is asked for; whole frames and seconds.
+// The parameters of a run, in whole frames and seconds.
 struct Request {
   std::vector<std::string> ports;
   std::vector<int> formatIndexes;
@@ -39,13 +39,13 @@ struct Request {
   int seconds = 2;
 };
 
-// Which calls fail, by their number in the run, from 1, and with what error's text; nothing for none of its own. Every
-// call counts but the sleep.
+// The failing calls, by their number in the run starting at 1, and the texts of their errors; nothing for a failure
+// without an error. All calls count except the sleep.
 using Failures = std::map<std::size_t, std::optional<std::string>>;
 
 struct Prediction {
-  std::string told;       // as tests/support/run_transcript.h tells a run
-  std::size_t calls = 0;  // how many calls that can fail the run makes
+  std::string told;       // in the format of tests/support/run_transcript.h
+  std::size_t calls = 0;  // the number of calls that can fail
 };
 
 Prediction predictRun(const Phone& phone, const Request& request, const Failures& failures, bool hasPlaceForError);

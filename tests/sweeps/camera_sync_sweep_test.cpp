@@ -1,5 +1,5 @@
-// Makes every call of a camera synchronisation fail, and every two calls, and compares each run to the last word with
-// what the oracle says it must be.
+// Makes every call and every pair of calls of a camera synchronisation fail, and compares the complete trace of each
+// run with the oracle's prediction.
 #include "backends/simulated/scenario/scenario.h"
 #include "backends/simulated/simulated_phone.h"
 #include "contract/message_format.h"
@@ -20,7 +20,7 @@
 namespace quazor {
 namespace {
 
-// One run, as the diagnostic of that name is registered to make it, on one phone.
+// A run on one phone, of the experiment as registered for the diagnostic of that name.
 struct Sweep {
   const char* name;
   bool masterConfiguration;
@@ -178,8 +178,8 @@ TEST_P(CameraSyncSweep, EveryCallMayFail) {
   EXPECT_EQ(beyond.told, run({}, ErrorPlace::kGiven).told);
 }
 
-// Of all ways in which two calls can fail, those in which an error could be mistaken for another's, or be there where
-// none may be.
+// Covers the pairs of failing calls in which an error could be confused with another one, or stored where none is
+// allowed.
 TEST_P(CameraSyncSweep, EveryTwoCallsMayFail) {
   const std::size_t healthyCalls = run({}, ErrorPlace::kGiven).calls;
   ASSERT_GT(healthyCalls, 20U);

@@ -1,4 +1,4 @@
-// The plug-in's camera experiments over the capture service on V4L2 and a made-up video driver.
+// The plug-in's camera experiments with the V4L2 capture service and a fake video driver.
 #include "backends/linux/capture/linux_capture_for_tests.h"
 #include "backends/threads/thread_concurrency.h"
 #include "diagnostics/camera_sync/camera_sync_experiment.h"
@@ -15,7 +15,7 @@ namespace {
 using Fake = FakeCameras;
 using namespace std::chrono_literals;
 
-// Whoever sleeps lets the made-up cameras' time pass; `during` happens in the middle.
+// Sleeping advances the time of the fake cameras; `during` is called in the middle.
 class FakeClock final : public Clock {
  public:
   explicit FakeClock(std::shared_ptr<FakeV4l2Api> kernel) : kernel_(std::move(kernel)) {}
@@ -35,7 +35,7 @@ class FakeClock final : public Clock {
 };
 
 struct Outcome {
-  std::string error;  // "" for none
+  std::string error;  // empty if there is none
   std::unique_ptr<QZExperimentResult> result;
 
   double measured(std::string_view name) const {
@@ -72,7 +72,7 @@ class CameraSyncOnLinuxTest : public testing::Test {
                                       std::move(formats), std::move(rate), platform());
     return outcomeOf(experiment, Dictionary{{"duration", 2.99}});
   }
-  // A healthy run, which shows that what was before left nothing busy.
+  // A healthy run, which shows that earlier runs left nothing in use.
   void expectHealthyRun() {
     const Outcome outcome = run();
     ASSERT_NE(outcome.result, nullptr) << outcome.error;
@@ -175,7 +175,7 @@ TEST_F(CameraSyncOnLinuxTest, ACameraInUseElsewhereCannotBeSynchronised) {
   expectHealthyRun();
 }
 
-// Constants for all that a frame's record needs but for what comes with the metadata buffer.
+// Constants for all metadata of a frame's record that does not come from the metadata buffer.
 Binding projectorBinding() {
   Binding binding = fakeBinding();
   MetadataBinding& metadata = binding.cameras[3].metadata;
@@ -199,7 +199,7 @@ class ProjectorFaultOnLinuxTest : public testing::Test {
   void setMetadata(std::vector<std::uint8_t> metadata) {
     fake_.kernel->with(fake_.nodes[3], [&](FakeNode& node) { return (node.metadata = std::move(metadata)).size(); });
   }
-  // `during` happens after some frames. A run that was over before, as on a busy machine, is made again.
+  // Calls `during` after some frames. Repeats a run that ended before, as may happen on a busy machine.
   Outcome run(const std::function<void()>& during = nullptr) {
     for (int i = 0; i < 10; ++i) {
       std::atomic<bool> happened = during == nullptr;
@@ -213,7 +213,7 @@ class ProjectorFaultOnLinuxTest : public testing::Test {
     return {"No run was long enough.", nullptr};
   }
 
-  // `later` is called again and again once some frames have come.
+  // Calls `later` repeatedly after some frames have arrived.
   Outcome runOnce(const std::function<void()>& later) {
     Platform platform;
     platform.capture = fake_.capture;

@@ -1,5 +1,5 @@
-// A program that runs the projector fault experiment with a timeout of some thirty years, ends the run by a frame, and
-// then ends itself, the timeout still pending. Prints the steady clock's nanoseconds at the end of the run.
+// Runs the projector fault experiment with a timeout of about thirty years, ends the run with a frame, and exits while
+// the timeout is pending. Prints the steady clock's nanoseconds at the end of the run.
 #include "backends/threads/real_clock.h"
 #include "backends/threads/thread_concurrency.h"
 #include "diagnostics/projector_fault/tessel_fault_experiment.h"
@@ -11,7 +11,7 @@
 
 int main() {
   using namespace quazor;
-  // Its experiment is never destroyed, and may look at its clock to the very end.
+  // The experiment is never destroyed and may use its clock until the process ends.
   const auto clock = std::make_shared<RealClock>();
   const auto stream = std::make_shared<HandMadeStream>();
   HandMadeBuffer buffer;

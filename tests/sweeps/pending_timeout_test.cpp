@@ -1,4 +1,4 @@
-// Who holds an experiment longest, and where and when it goes.
+// The last owner of an experiment, and where and when the experiment is destroyed.
 #include "backends/threads/real_clock.h"
 #include "backends/threads/thread_concurrency.h"
 #include "contract/log_channel.h"
@@ -24,7 +24,7 @@ struct Moment {
   std::thread::id thread = std::this_thread::get_id();
 };
 
-// Tells of the timeout's line.
+// Reports the log line of the timeout.
 class TimeoutLog final : public LogBackend {
  public:
   void write(LogLevel, std::string_view, std::string_view, std::string_view text) override {
@@ -36,7 +36,7 @@ class TimeoutLog final : public LogBackend {
   std::promise<Moment> timeout_;
 };
 
-// A clock that belongs to the experiment alone, and so goes with it.
+// A clock owned only by the experiment, so it is destroyed with the experiment.
 class LastClock final : public Clock {
  public:
   explicit LastClock(std::promise<Moment>& end) : end_(end) {}
@@ -51,11 +51,11 @@ class LastClock final : public Clock {
   std::promise<Moment>& end_;
 };
 
-// An experiment that has had its run, with a timeout of a few milliseconds; until the end of this it is the log's only
-// experiment.
+// An experiment whose run is over and had a timeout of a few milliseconds. During the lifetime of this object it is the
+// only experiment that logs.
 class RunWithTimeout {
  public:
-  // Ended by its first frame, or by the timeout, which is in seconds.
+  // The first frame ends the run, or else the timeout, in seconds.
   explicit RunWithTimeout(bool hasFrame, double timeout = kShortestTimeout) {
     sharedLog().setBackend(log_, LogLevel::kError);
     if (hasFrame) {
@@ -80,15 +80,15 @@ class RunWithTimeout {
   RunWithTimeout& operator=(const RunWithTimeout&) = delete;
   ~RunWithTimeout() { sharedLog().setBackend(nullptr, LogLevel::kError); }
 
-  // How many hold the experiment.
+  // The number of owners of the experiment.
   long holders() const { return experiment_.use_count(); }
-  // Lets go of it; returns just before.
+  // Releases it and returns the time just before that.
   Moment release() {
     const Moment moment;
     experiment_.reset();
     return moment;
   }
-  // Waits for the timeout, and for the end of the experiment. Each once.
+  // Waits for the timeout, and for the end of the experiment. May be called once each.
   Moment timeout() { return log_->timeout(); }
   Moment end() { return end_.get_future().get(); }
 
@@ -100,12 +100,12 @@ class RunWithTimeout {
   std::shared_ptr<QZTesselFaultExperiment> experiment_;
 };
 
-// A busy machine may be late sometimes; whoever is late every time is late by itself.
+// A busy machine is late in some attempts only.
 constexpr int kAttempts = 50;
 
 TEST(PendingTimeout, TakesTheExperimentWithItWhenTheHostHasLetGo) {
   for (int i = 0; i < kAttempts; ++i) {
-    // The longer it is the sooner a host on a busy machine lets go before.
+    // A longer timeout makes it more likely that the host on a busy machine releases the experiment first.
     RunWithTimeout run(true, (i + 1) * kShortestTimeout);
     const Moment released = run.release();
     const Moment timeout = run.timeout();
@@ -130,7 +130,7 @@ TEST(PendingTimeout, HoldsNothingAfterItHasEndedTheRun) {
   for (int i = 0; i < kAttempts; ++i) {
     RunWithTimeout run(false);
     const Moment timeout = run.timeout();
-    run.release();  // at the moment at which the timeout lets go too
+    run.release();  // at the moment at which the timeout releases it too
     if (run.end().time - timeout.time < kMaxDelay) return;
   }
   FAIL() << "the experiment did not go in time";

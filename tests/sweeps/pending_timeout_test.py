@@ -1,10 +1,10 @@
 #!/usr/bin/env python3
-"""Checks that a pending timeout delays no process's end.
+"""Checks that a pending timeout does not delay the end of a process.
 
     pending_timeout_test.py PROGRAM
 
-PROGRAM (pending_timeout.cpp) prints the steady clock's nanoseconds and ends. At least one of several runs, and so the
-program and not a busy machine, must be gone within 100 ms from then; every run must succeed.
+PROGRAM (pending_timeout.cpp) prints the steady clock's nanoseconds and ends. In at least one of several runs, which
+excludes delays by a busy machine, the program must end within 100 ms of that time; every run must succeed.
 """
 
 import os
@@ -15,13 +15,13 @@ import unittest
 
 MIN_RUNS, MAX_RUNS = 10, 100
 LIMIT = 100e6  # nanoseconds
-# A thread sanitizer would wait a second for late reports of its own; https://github.com/google/sanitizers/wiki,
+# By default the thread sanitizer waits a second for its own late reports; https://github.com/google/sanitizers/wiki,
 # "ThreadSanitizerFlags".
 ENVIRONMENT = dict(os.environ, TSAN_OPTIONS=os.environ.get("TSAN_OPTIONS", "") + " atexit_sleep_ms=0")
 
 
 def delay(command):
-    """Runs a command and returns the nanoseconds from the moment that it prints to its end."""
+    """Runs a command and returns the nanoseconds from the time that it prints to its end."""
     done = subprocess.run(command, stdout=subprocess.PIPE, text=True, timeout=60, check=True,
                           env=ENVIRONMENT)
     return time.clock_gettime_ns(time.CLOCK_MONOTONIC) - int(done.stdout)

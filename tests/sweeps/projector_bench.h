@@ -1,4 +1,4 @@
-// A simulated phone to run the projector fault experiment on, and all that can be seen of such a run.
+// A simulated phone for the projector fault experiment, and everything that can be observed of a run.
 #pragma once
 
 #include "backends/faults/fault.h"
@@ -14,23 +14,23 @@
 
 namespace quazor {
 
-// A front camera, then the infrared camera, "front-infrared", with a projector: 30 frames per second, an event after
-// 10 ms, and 1 to 6 errors on its counters. Five report channels, of which the fault report has four: one that counts
-// 2 up in the first millisecond of streaming, one in another group, one that stands still and one without a count.
+// A front camera, then the infrared camera "front-infrared" with a projector: 30 frames per second, an event after 10
+// ms, and error counters from 1 to 6. The fault report has four of its five report channels: one that increases by 2 in
+// the first millisecond of streaming, one in another group, one that is constant and one without a count.
 Scenario projectorScenario();
-// The infrared camera of such a scenario, to change it.
+// The infrared camera of such a scenario, for modification.
 Camera& infraredCamera(Scenario& scenario);
-// Makes the metadata of the infrared camera's frame special; frames count from 1, as the experiment counts them.
+// Sets the metadata of a frame of the infrared camera; frames are numbered from 1, like in the experiment.
 void setFrame(Scenario& scenario, std::uint64_t number, FrameMetadata metadata);
 
-// Frames that no projector lit.
+// Metadata of a frame that the projector did not light.
 FrameMetadata unlitFrame();
 FrameMetadata unlitFrameForSafety();
 
 struct ProjectorRequest {
   Value frameCount = 3;
   Value timeout = 0.21;
-  std::chrono::milliseconds watched{250};  // when, on the phone's clock, the bench stops to watch
+  std::chrono::milliseconds watched{250};  // the end of the observation, on the phone's clock
   std::uint64_t seed = 1;
 };
 
@@ -45,8 +45,8 @@ struct ProjectorRun {
   std::vector<std::uint64_t> fired;  // how often each of the faults happened
 };
 
-// Sets a new experiment up, runs it on a new phone in virtual time, lets time pass, and tears it down. The place for an
-// error is the run's and, holding callersOwnError() once more, the teardown's.
+// Sets up a new experiment, runs it on a new phone in virtual time, lets time pass, and tears it down. The run and the
+// teardown get an error variable, which contains callersOwnError() before each, or none.
 ProjectorRun runProjector(const Scenario& scenario, const ProjectorRequest& request, const std::vector<Fault>& faults,
                           ErrorPlace place);
 

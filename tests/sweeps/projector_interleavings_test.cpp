@@ -1,4 +1,4 @@
-// The projector fault experiment's frames, events, errors and timeout in every order in which they can meet.
+// Frames, events, errors and timeout of the projector fault experiment in every possible order.
 #include "backends/simulated/time/virtual_scheduler.h"
 #include "tests/sweeps/projector_trace.h"
 #include "tests/sweeps/projector_virtual_run.h"
@@ -16,8 +16,8 @@
 namespace quazor {
 namespace {
 
-// Whether all plans are wanted, for which an optimised build needs some minutes. Without, the larger ones are left out;
-// those that are tried are tried in every order all the same.
+// True if all plans are requested, which takes some minutes in an optimised build. Otherwise the larger plans are
+// omitted; the others are still run in every order.
 bool isThorough() { return std::getenv("QUAZOR_THOROUGH") != nullptr; }
 
 #if defined(QUAZOR_THREAD_SANITIZER)
@@ -53,12 +53,12 @@ TEST(EveryOrderTest, LeadsIntoEachOrderOnce) {
     seen.insert(order);
     ++runs;
   } while (orders->toNextOrder());
-  EXPECT_EQ(runs, 10U);  // 5 over 2
+  EXPECT_EQ(runs, 10U);  // the binomial coefficient of 5 and 2
   EXPECT_EQ(seen.size(), 10U);
   EXPECT_TRUE(seen.contains("a12b3"));
 }
 
-// Runs plans in every order, and counts.
+// Runs plans in every order and counts the runs.
 class ProjectorInterleavings : public testing::Test {
  protected:
   void TearDown() override {
@@ -93,14 +93,14 @@ class ProjectorInterleavings : public testing::Test {
   std::size_t orders_ = 0;
 };
 
-// `count` frames at once; the `bad`th, from 1, is of that kind, and all others are lit.
+// `count` simultaneous frames; frame number `bad`, from 1, is of that kind, and all others are lit.
 std::vector<Delivery> frames(std::size_t count, std::size_t bad, FrameKind kind) {
   std::vector<Delivery> deliveries(count);
   if (bad != 0) deliveries[bad - 1].kind = kind;
   return deliveries;
 }
 
-// Calls `use` with every combination of up to `most` frames, the one bad frame among them, and the stop count.
+// Calls `use` with every combination of up to `most` frames, including one bad frame, and of the stop count.
 template <class Use>
 void forEachPlan(std::size_t most, const std::vector<FrameKind>& kinds, Use use) {
   for (std::size_t count = 0; count <= most; ++count) {
@@ -121,7 +121,7 @@ void forEachPlan(std::size_t most, const std::vector<FrameKind>& kinds, Use use)
 const std::vector<FrameKind> kOneOfEach{FrameKind::kUnlit, FrameKind::kWithoutMetadata};
 const std::vector<FrameKind> kAllBad(kFrameKinds.begin() + 1, kFrameKinds.end());
 
-// The timeout comes when all else is over: the frames race among themselves and with the host.
+// The timeout expires after everything else: the frames race with each other and with the host.
 TEST_F(ProjectorInterleavings, WithATimeoutAfterAllFrames) {
   forEachPlan(4, kOneOfEach, [this](const ProjectorPlan& plan) { tryEveryOrder(plan); });
 }
@@ -144,7 +144,7 @@ TEST_F(ProjectorInterleavings, WithFourFramesABadOneAndATimeoutAtAnyMoment) {
   tryEveryOrder(withTimeoutAtAnyMoment(plan));
 }
 
-// The first frames are over and done with when the timeout comes, the others come with it.
+// The timeout expires after the first frames have been processed and at the same time as the other frames.
 TEST_F(ProjectorInterleavings, WithATimeoutAmidTheFrames) {
   forEachPlan(isThorough() ? 4 : 3, kOneOfEach, [this](ProjectorPlan plan) {
     plan.timeout = 1;
@@ -156,8 +156,8 @@ TEST_F(ProjectorInterleavings, WithATimeoutAmidTheFrames) {
   });
 }
 
-// A frame may arrive, be counted and be examined while the start has not yet returned, while a stop is under way, and
-// while another frame is being read.
+// A frame may arrive, be counted and be examined before start() has returned, during a stop, and while another frame is
+// being read.
 TEST_F(ProjectorInterleavings, WithASlowCameraAndATimeoutAtOnce) {
   if (kHasThreadSanitizer) GTEST_SKIP() << "it would take a lock that is held while others go on for a mistake";
   forEachPlan(isThorough() ? 3 : 1, kOneOfEach, [this](ProjectorPlan plan) {
@@ -176,7 +176,7 @@ TEST_F(ProjectorInterleavings, OfEveryTwoBadFrames) {
       plan.stopCount = 3;
       tryEveryOrder(withTimeoutAtAnyMoment(plan));
       if (!isThorough()) continue;
-      // And a lit one before, between and behind them.
+      // With a lit frame before, between and after them.
       for (std::size_t lit = 0; lit < 3; ++lit) {
         ProjectorPlan larger = plan;
         larger.deliveries.insert(larger.deliveries.begin() + static_cast<std::ptrdiff_t>(lit), Delivery{});
@@ -209,7 +209,7 @@ TEST_F(ProjectorInterleavings, OfTwoThreadsOfTheCameraWithEvents) {
   }
 }
 
-// A larger plan, drawn by its seed.
+// A larger random plan for the seed.
 ProjectorPlan drawPlan(std::uint64_t seed) {
   RandomStrategy random(seed);
   const auto chance = [&random](std::size_t oneIn) { return random.choose(oneIn) == 0; };
@@ -223,7 +223,7 @@ ProjectorPlan drawPlan(std::uint64_t seed) {
     delivery.isEvent = chance(6);
     if (chance(badOneIn)) delivery.kind = kAllBad[random.choose(kAllBad.size())];
     delivery.thread = random.choose(threads);
-    if (!chance(3)) at += std::chrono::milliseconds(33);  // otherwise it comes in a burst with the one before
+    if (!chance(3)) at += std::chrono::milliseconds(33);  // otherwise simultaneous with the previous frame
     delivery.at = at;
     plan.deliveries.push_back(delivery);
   }

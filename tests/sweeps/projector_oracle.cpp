@@ -14,7 +14,7 @@ std::string captureError(int code, const std::string& message) {
 }
 std::string reportError(const std::string& message) { return "QZTelemonErrorDomain code 100: " + message; }
 
-// The shortest text that reads back.
+// The shortest text that parses to the same number.
 std::string shortest(double number) {
   char text[40];
   return {text, std::to_chars(text, text + sizeof text, number).ptr};
@@ -22,12 +22,12 @@ std::string shortest(double number) {
 
 bool contains(const std::string& text, const char* part) { return text.find(part) != std::string::npos; }
 
-// The calls of a run, counted and told.
+// Counts the calls of a run and writes their trace.
 class Calls {
  public:
   explicit Calls(const Failures& failures) : failures_(failures) {}
 
-  // The next call: whether it succeeds. Afterwards cause() is how its error goes on in that of the run.
+  // The next call; returns whether it succeeds. cause() is then the continuation of the run's error.
   bool make(const std::string& line) {
     const auto failure = failures_.find(++count_);
     const bool fails = failure != failures_.end();
@@ -53,7 +53,7 @@ std::string errorLine(bool hasPlace, const std::string& error) {
   return error.empty() ? "error untouched\n" : "error " + error + '\n';
 }
 
-// Measurements in the order in which their names were first set.
+// Measurements in the order of their first assignment.
 class Measurements {
  public:
   void set(const std::string& name, const std::string& text) {
@@ -75,7 +75,7 @@ class Measurements {
   std::vector<std::pair<std::string, std::string>> entries_;
 };
 
-// One run of the fault experiment, step by step. Each step says whether the run goes on.
+// A run of the fault experiment, step by step. Each step returns whether the run continues.
 class FaultRun {
  public:
   FaultRun(const Phone& phone, const Request& request, const Failures& failures)
@@ -97,7 +97,7 @@ class FaultRun {
 
  private:
   static std::int64_t nanoseconds(double seconds) { return static_cast<std::int64_t>(seconds * 1e9); }
-  // When the frame comes: at the end of its thirtieth of a second, on the next nanosecond.
+  // The arrival time of a frame: the end of its thirtieth of a second, rounded up to a nanosecond.
   static std::int64_t timeOf(std::uint64_t frame) {
     return static_cast<std::int64_t>((frame * 1'000'000'000 + 29) / 30);
   }
@@ -112,7 +112,7 @@ class FaultRun {
 
   bool open() {
     if (!require("service defaultPlugIn", 200, "Failed to get the capture plugin!")) {
-      return fail(captureError(200, "Failed to get the capture plugin!"));  // the call has no error to hand back
+      return fail(captureError(200, "Failed to get the capture plugin!"));  // the call cannot store an error
     }
     if (!require("plug-in get device", 200, "Failed to get the capture plugin!")) return false;
     hasDevice_ = true;
@@ -161,7 +161,7 @@ class FaultRun {
   }
   static bool isWatched(const PhoneChannel& channel) { return channel.subGroup == "K42ISP Events"; }
 
-  // From the start to the end of the waiting.
+  // From the start to the end of the wait.
   bool stream() {
     if (!require(stream_ + " start", 204, "Failed to start streaming ferrin.")) return false;
     started_ = true;
@@ -171,7 +171,7 @@ class FaultRun {
     return fail(streamError_);
   }
 
-  // The next thing that happens by itself: a frame, the event, the timeout.
+  // The next event: a frame, the camera's event or the timeout.
   void passOneMoment() {
     now_ = nextMoment();
     if (now_ == kEventTime && running_ && phone_.eventAfterTenMilliseconds) {
@@ -197,7 +197,7 @@ class FaultRun {
     while (nextMoment() <= end) passOneMoment();
   }
 
-  // A buffer comes back only when its frame went on to be examined.
+  // A buffer is released only if its frame was passed on to be examined.
   void takeFrame(std::uint64_t comes) {
     if (stopped_) {
       calls_.tell("log default: Received frame that won't be counted at time: " +
@@ -294,14 +294,14 @@ class FaultRun {
   const Phone& phone_;
   const Request& request_;
   Calls calls_;
-  std::string error_;  // in the caller's place; empty when the run has written none
+  std::string error_;  // in the caller's variable; empty if the run stored none
 
   bool hasDevice_ = false;
-  std::string stream_;  // the id of the stream that was found
+  std::string stream_;  // the ID of the selected stream
   bool started_ = false;
   bool running_ = false;
   bool stopped_ = false;
-  std::string streamError_;  // what ended the stream; empty for none
+  std::string streamError_;  // the error that ended the stream; empty if there was none
   std::int64_t now_ = -1;    // nanoseconds since the start
   std::uint64_t nextFrame_ = 1;
   std::uint64_t counted_ = 0;

@@ -1,7 +1,7 @@
-// A second opinion on runs of the projector fault and the report channel presence experiments: what they must do and
-// say, worked out from numbers and strings alone.
+// An oracle for runs of the projector fault and the report channel presence experiments: predicts their traces from
+// numbers and strings.
 //
-// Nothing here knows the experiments, the platform or the simulated phone.
+// It does not use the experiments, the platform or the simulated phone.
 #pragma once
 
 #include <array>
@@ -24,10 +24,10 @@ struct PhoneChannel {
   std::string subGroup;
   std::string name;
   std::optional<std::uint64_t> count;      // before a run
-  std::uint64_t countedWhenStreaming = 0;  // in the first millisecond of a stream
+  std::uint64_t countedWhenStreaming = 0;  // in the first millisecond of streaming
 };
 
-// What is wrong with a frame. The fields of a dark one are those of its CSV line behind the time.
+// The defects of a frame. The fields of a dark frame are those of its CSV line after the time.
 enum class FrameFault { kDark, kDarkForSafety, kNoMetadata, kNoDictionary, kIncomplete };
 struct PhoneFrame {
   FrameFault fault = FrameFault::kDark;
@@ -36,28 +36,28 @@ struct PhoneFrame {
 
 struct Phone {
   std::vector<PhoneStream> streams;
-  std::array<int, 6> errorCounters{};  // in the order of a result
+  std::array<int, 6> errorCounters{};  // in the order of the measurements
   std::vector<PhoneChannel> channels;
-  std::map<std::uint64_t, PhoneFrame> frames;  // the frames that are not lit, by number from 1
-  bool sendsFrames = true;                     // 30 a second
+  std::map<std::uint64_t, PhoneFrame> frames;  // frames that are not lit, by number starting at 1
+  bool sendsFrames = true;                     // 30 per second
   std::optional<int> eventAfterTenMilliseconds;
 };
 
-// Times are in seconds from the start of the stream, which takes none. Neither time may be that of a frame.
+// Times are in seconds since the start of the stream, which takes no time. No time may coincide with a frame.
 struct Request {
   std::uint64_t frameCount = 3;
   double timeout = 0.21;
   double watched = 0.25;
 };
 
-// Which calls fail, by their number in the run, from 1, and with what error's text; nothing for none of its own. The
-// teardown's call counts; the narrowing of the channels does not.
+// The failing calls, by their number in the run starting at 1, and the texts of their errors; nothing for a failure
+// without an error. The teardown's call counts; the filtering of the channels does not.
 using Failures = std::map<std::size_t, std::optional<std::string>>;
 
 struct Prediction {
-  std::string
-      told;  // as tests/sweeps/projector_bench.h tells a run, or tests/support/run_transcript.h one of the presence
-  std::size_t calls = 0;  // how many calls that can fail are made
+  // In the format of tests/sweeps/projector_bench.h or, for the presence, of tests/support/run_transcript.h.
+  std::string told;
+  std::size_t calls = 0;  // the number of calls that can fail
 };
 
 Prediction predictFaultRun(const Phone& phone, const Request& request, const Failures& failures, bool hasPlaceForError);

@@ -1,5 +1,5 @@
-// The projector fault experiment on real threads: everything that can end a run at once, again and again. Meant to be
-// run under the thread sanitizer too; QUAZOR_THOROUGH in the environment asks for many more rounds.
+// The projector fault experiment on real threads: all events that can end a run, concurrently and repeatedly. Also run
+// it under the thread sanitizer; QUAZOR_THOROUGH in the environment requests many more rounds.
 #include "backends/threads/real_clock.h"
 #include "backends/threads/thread_concurrency.h"
 #include "diagnostics/projector_fault/tessel_fault_experiment.h"
@@ -29,8 +29,8 @@ constexpr std::size_t kThreads = 3;       // of the camera
 constexpr std::size_t kFrames = 8;        // of each thread
 constexpr std::size_t kMaxTimeout = 600;  // microseconds
 
-// What a round asks for: the frames that each thread delivers, in a burst or with pauses, when the run ends without a
-// bad one, and whether the host tears down before it lets go.
+// The parameters of a round: the frames that each thread delivers, in a burst or with pauses, the frame that ends a run
+// without a bad one, and whether the host tears down before it releases the experiment.
 struct Round {
   std::array<std::array<FrameKind, kFrames>, kThreads> frames{};
   bool hasPauses = false;
@@ -40,7 +40,7 @@ struct Round {
   bool hasBadFrames = false;
 };
 
-// In half of the rounds frames fail on both queues at once: one is examined while the next one is taken in.
+// In half of the rounds frames fail on both queues concurrently: one is examined while the next one is received.
 Round drawRound(std::minstd_rand& random) {
   Round round;
   const std::size_t most = kThreads * kFrames;
@@ -53,14 +53,14 @@ Round drawRound(std::minstd_rand& random) {
     }
   }
   round.hasPauses = random() % 2 == 0;
-  // Mostly beside the last frame that can be the last one.
+  // Usually close to the last frame that can end the run.
   round.stopCount = random() % 2 == 0 ? random() % most : most + random() % 2;
   round.timeout = 1e-6 * static_cast<double>(random() % kMaxTimeout);
   round.hostTearsDown = random() % 2 == 0;
   return round;
 }
 
-// The order in which the stream was asked for things.
+// Records the order of the calls to the stream.
 struct StreamCalls {
   std::atomic<int> countersRead{0};
   std::atomic<int> stops{0};
@@ -78,7 +78,7 @@ class ProjectorStress : public testing::Test {
     for (const auto& [end, count] : ends_) std::cout << "[stress] " << count << " rounds: " << end << '\n';
   }
 
-  // Runs a round to its very end: nothing of it is left.
+  // Runs a round until nothing of it is left.
   void run(const Round& round) {
     calls_.countersRead = 0;
     calls_.stops = 0;
@@ -96,7 +96,7 @@ class ProjectorStress : public testing::Test {
   }
 
  private:
-  // Makes an experiment, runs it and lets go of it at once.
+  // Creates an experiment, runs it and releases it at once.
   std::weak_ptr<void> runExperiment(const Round& round) {
     std::vector<std::thread> threads;
     const auto stream = std::make_shared<HandMadeStream>();
@@ -132,7 +132,7 @@ class ProjectorStress : public testing::Test {
     std::size_t delivered = 0;
     while (delivered < kFrames && stream.deliver(*buffers_[thread][delivered], MediaTime{})) {
       ++delivered;
-      // About as long as the processing queue needs to wake up; shorter ones the system does not keep.
+      // About as long as the processing queue needs to wake up; the system does not sleep for shorter times.
       if (hasPauses) std::this_thread::sleep_for(std::chrono::microseconds(1));
     }
     delivered_[thread] = delivered;
@@ -158,7 +158,7 @@ class ProjectorStress : public testing::Test {
     ++ends_[frames->value() < static_cast<double>(round.stopCount) ? "timeout" : "last frame, or timeout beside it"];
   }
 
-  // A buffer that was delivered is given back only if its frame could be handed on.
+  // A delivered buffer is released only if its frame was passed on.
   void checkBuffers(const Round& round) const {
     for (std::size_t i = 0; i < kThreads; ++i) {
       for (std::size_t j = 0; j < kFrames; ++j) {
@@ -176,7 +176,7 @@ class ProjectorStress : public testing::Test {
 
   const HandMadeReports::Descriptions channels_ = handMadeChannels(1);
   std::array<std::array<std::unique_ptr<HandMadeBuffer>, kFrames>, kThreads> buffers_;
-  std::array<std::size_t, kThreads> delivered_{};  // written by each thread, read when it has been joined
+  std::array<std::size_t, kThreads> delivered_{};  // written by each thread, read after the thread was joined
   StreamCalls calls_;
   std::map<std::string, int> ends_;
 };

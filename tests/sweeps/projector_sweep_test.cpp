@@ -1,5 +1,5 @@
-// Makes every call of a projector fault run and its teardown fail, and every two calls, and compares each run to the
-// last word with what the oracle says it must be.
+// Makes every call and every pair of calls of a projector fault run and its teardown fail, and compares the complete
+// trace of each run with the oracle's prediction.
 #include "backends/simulated/scenario/scenario.h"
 #include "tests/support/run_transcript.h"
 #include "tests/support/shipped_scenario.h"
@@ -22,13 +22,13 @@ namespace {
 using projector_oracle::FrameFault;
 using projector_oracle::PhoneFrame;
 
-// One run on one phone.
+// A run on one phone.
 struct Sweep {
   const char* name;
   projector_oracle::Request request = {};
   std::optional<FrameFault> secondFrame = {};
   bool sendsFrames = true;
-  bool isShipped = false;  // the healthy phone that comes with the program, not the bench's
+  bool isShipped = false;  // the shipped healthy phone instead of the bench's
 };
 void PrintTo(const Sweep& sweep, std::ostream* out) { *out << sweep.name; }
 
@@ -195,7 +195,7 @@ TEST_P(ProjectorSweep, EveryCallMayFail) {
   EXPECT_EQ(beyond.told, healthy.told);
 }
 
-// Without a place for an error both failures have errors, so that there is something that must not be stored.
+// Without an error variable both failures have errors, none of which may be stored.
 TEST_P(ProjectorSweep, EveryTwoCallsMayFail) {
   const std::size_t calls = check({}, ErrorPlace::kGiven).calls;
   ASSERT_GT(calls, 20U);

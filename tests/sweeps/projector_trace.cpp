@@ -18,7 +18,7 @@ bool isIntakeError(FrameKind kind) {
   return kind != FrameKind::kLit && kind != FrameKind::kUnlit && kind != FrameKind::kUnlitForSafety;
 }
 
-// The error that a frame ends the run with; empty for a lit one.
+// The error with which a frame ends the run; empty for a lit one.
 std::string errorOf(FrameKind kind, const std::string& number) {
   const std::string domain(kDomain);
   switch (kind) {
@@ -33,7 +33,7 @@ std::string errorOf(FrameKind kind, const std::string& number) {
   return "an unknown kind";
 }
 
-// Follows the lines from the first to the last.
+// Checks the lines from the first to the last.
 class Follower {
  public:
   Follower(const ProjectorPlan& plan, const ProjectorRun& run) : plan_(plan), run_(run) {}
@@ -66,7 +66,7 @@ class Follower {
     expect(false, "line " + std::to_string(at_) + " is out of place: " + line);
   }
 
-  // The next of what reached the handlers is taken in.
+  // The next delivery is received.
   std::size_t takeIn(bool isEvent) {
     expect(!isAlone(), "something was taken in by an experiment that should be gone");
     expect(taken_ < run_.delivered.size(), "more was taken in than was delivered");
@@ -127,7 +127,7 @@ class Follower {
     expect(line == "log debug: Processing event " + number + " at " + number + ".000000.", "not this event: " + line);
   }
 
-  // Something ends the run, with an error or, when that is empty, without. The first one stops the stream, at once.
+  // An event ends the run, with an error or, if that is empty, without one. The first such event stops the stream.
   void end(std::string error) {
     if (stopping_) return;
     stopping_ = true;
@@ -151,7 +151,7 @@ class Follower {
     signalled_ = true;
   }
 
-  // Nobody holds the experiment any more: not the host, not the timeout, no frame on its way.
+  // True if the experiment has no owner: the host, the timeout and all pending frames have released it.
   bool isAlone() const { return hostIsGone_ && timeouts_ == 1 && examined_ == handedOn_.size(); }
 
   void judgeEnd() {
@@ -204,17 +204,17 @@ class Follower {
   const ProjectorPlan& plan_;
   const ProjectorRun& run_;
   std::string problem_;
-  std::size_t at_ = 0;     // the next line
-  std::size_t taken_ = 0;  // of what was delivered
+  std::size_t at_ = 0;     // index of the next line
+  std::size_t taken_ = 0;  // deliveries received
   std::uint64_t counted_ = 0;
-  std::optional<std::size_t> reading_;                                // the frame that is counted and not yet read
-  std::vector<std::pair<std::size_t, std::uint64_t>> handedOn_ = {};  // delivery and frame number
+  std::optional<std::size_t> reading_;                                // the frame that was counted and not yet read
+  std::vector<std::pair<std::size_t, std::uint64_t>> handedOn_ = {};  // index of the delivery, and frame number
   std::size_t examined_ = 0;
   int timeouts_ = 0;
   bool stopping_ = false;
   bool signalled_ = false;
   bool hostIsGone_ = false;
-  std::string error_;  // what the run must fail with; empty for a result
+  std::string error_;  // the expected error of the run; empty for a result
 };
 
 }  // namespace

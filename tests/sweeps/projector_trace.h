@@ -1,4 +1,4 @@
-// What happened in a run of the projector fault experiment on the hand-made camera, and whether it was right.
+// The trace of a run of the projector fault experiment on the hand-written camera, and its verification.
 #pragma once
 
 #include "contract/diagnostic_contract.h"
@@ -15,44 +15,44 @@
 
 namespace quazor {
 
-// A frame or an event that the camera delivers. Its number is its place in the plan; it is of that second.
+// A frame or an event that the camera delivers. Its number is its index in the plan, and its time stamp in seconds.
 struct Delivery {
   bool isEvent = false;
-  FrameKind kind = FrameKind::kLit;  // of a frame
-  std::size_t thread = 0;            // the camera's threads deliver independently, each its own in the plan's order
+  FrameKind kind = FrameKind::kLit;  // for a frame
+  std::size_t thread = 0;            // the camera's threads are independent; each delivers its own items in order
   std::chrono::nanoseconds at{0};    // after the start
 };
 
-// What a run is given.
+// The input of a run.
 struct ProjectorPlan {
   std::vector<Delivery> deliveries;
   std::uint64_t stopCount = 1;
   double timeout = 10;          // seconds
-  bool timerIsSlow = false;     // a timeout that is due may reach its queue at any later moment
-  bool cameraIsSlow = false;    // everything else may go on while the camera does what it is asked for
-  bool stops = true;            // the stream lets itself be stopped
-  bool countersAreRead = true;  // the stream has error counters
+  bool timerIsSlow = false;     // an expired timeout may reach its queue at any later time
+  bool cameraIsSlow = false;    // everything else may run during a call of the camera
+  bool stops = true;            // false: stopping the stream fails
+  bool countersAreRead = true;  // false: the stream has no error counters
 };
 std::string describe(const ProjectorPlan& plan);
 
-// What happened.
+// The trace of a run.
 struct ProjectorRun {
-  // In order, as RunTranscript tells it: the log's lines and
-  //   frame 3 attachment MetadataDictionary    as the reading of frame 3 ends
-  //   stream get ErrorCounters                 as it begins
-  //   stream stop                              as it ends
+  // In order, in the format of RunTranscript: the log lines and
+  //   frame 3 attachment MetadataDictionary    at the end of reading frame 3
+  //   stream get ErrorCounters                 at the beginning of the call
+  //   stream stop                              at the end of the call
   //   semaphore signal
-  //   host release                             the host lets go of the experiment, after its run
+  //   host release                             the host releases the experiment after its run
   std::vector<std::string> lines;
-  std::vector<std::size_t> delivered;  // the numbers of what reached the handlers, in order
+  std::vector<std::size_t> delivered;  // the numbers of the items that reached the handlers, in order
   std::unique_ptr<QZExperimentResult> result;
   DiagnosticErrorPtr error;
-  std::vector<int> references;    // to the buffer of each delivery, when all is over
-  bool experimentIsGone = false;  // when all is over
+  std::vector<int> references;    // to the buffer of each delivery, at the end
+  bool experimentIsGone = false;  // at the end
 };
 
-// What is wrong with the run, in a few words; empty when nothing is. Judges by the rules alone: it follows the lines
-// with a small model of its own, and so needs no knowledge of the order in which things came to happen.
+// A short description of the first error in the run; empty if it is correct. Checks the trace with a small model of the
+// rules, so it accepts every order of events that the rules allow.
 std::string problemOf(const ProjectorPlan& plan, const ProjectorRun& run);
 
 }  // namespace quazor

@@ -31,7 +31,7 @@ class WatchedSemaphore final : public Semaphore {
   RunTranscript& transcript_;
 };
 
-// Delayed tasks come from a timer of their own that takes its time.
+// A separate timer posts the delayed tasks, at any time after they are due.
 class SlowTimerQueue final : public SerialQueue {
  public:
   SlowTimerQueue(std::shared_ptr<SerialQueue> queue, VirtualScheduler& scheduler)
@@ -80,7 +80,7 @@ std::vector<std::string> linesOf(const std::string& text) {
   return lines;
 }
 
-// The camera of a plan, at work in virtual time.
+// The camera of a plan in virtual time.
 class PlannedCamera {
  public:
   PlannedCamera(const ProjectorPlan& plan, std::shared_ptr<VirtualScheduler> scheduler, RunTranscript& transcript)
@@ -118,7 +118,7 @@ class PlannedCamera {
     }
   }
 
-  // Lets everything else that can happen go first, as far as it is chosen to.
+  // Lets any number of other possible events happen first.
   void takeTime() {
     if (plan_.cameraIsSlow) scheduler_->blockUntil([] { return true; }, "nothing");
   }

@@ -12,16 +12,16 @@
 
 namespace quazor {
 
-// Leads a program that is run again and again into every order of events there is, one after another: depth first, by
-// repeating the choices of the run before up to the last one that had another possibility.
+// Runs a program repeatedly in every possible order of events, depth first: repeats the choices of the previous run up
+// to the last one that had another alternative.
 class EveryOrder final : public ScheduleStrategy {
  public:
   // The next choice of this run.
   std::size_t choose(std::size_t count) override;
-  // To be called between two runs. False when there is no further order.
+  // Call this between two runs. Returns false if there are no further orders.
   bool toNextOrder();
 
-  // The choices of this run: which one, of how many.
+  // The choices of this run: the index, and the number of alternatives.
   const std::vector<std::pair<std::size_t, std::size_t>>& choices() const { return choices_; }
 
  private:
@@ -29,8 +29,8 @@ class EveryOrder final : public ScheduleStrategy {
   std::size_t at_ = 0;
 };
 
-// Runs the plan to its end, with what is left to happen when the host has let go of the experiment. Leaves the
-// scheduler with nothing to do, fit for another run.
+// Runs the plan to its end, including the events after the host has released the experiment. Afterwards the scheduler
+// is idle and can be used for another run.
 ProjectorRun runVirtually(const ProjectorPlan& plan, const std::shared_ptr<VirtualScheduler>& scheduler);
 
 }  // namespace quazor

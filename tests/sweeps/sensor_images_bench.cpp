@@ -33,7 +33,7 @@ std::string_view nameOf(RunLoopResult result) {
   return "run ended for no known reason";
 }
 
-// The phone's loop as the run has it: what is done with it is told, and what stands on it counted.
+// The phone's run loop, which records the calls and counts what is added to it.
 class WatchedLoop final : public RunLoop {
  public:
   using Tell = std::function<void(std::string_view operation, const std::string& detail)>;
@@ -116,7 +116,7 @@ std::string entriesOf(const QZNimbeCorvaneImage& image) {
          "; timestampInMilliseconds = " + defaultText(image.timestampInMilliseconds()) + "}";
 }
 
-// Who receives the images of a stream without an experiment.
+// Receives the images of a stream without an experiment.
 class Listener final : public QZNimbeImageStreamDelegate {
  public:
   Listener(std::function<void(const std::string& line)> tell, std::function<void()> close)
@@ -130,7 +130,7 @@ class Listener final : public QZNimbeImageStreamDelegate {
 
  private:
   const std::function<void(const std::string& line)> tell_;
-  const std::function<void()> close_;  // empty when the listener does not close the stream
+  const std::function<void()> close_;  // empty if the listener does not close the stream
 };
 
 class Bench {
@@ -179,7 +179,7 @@ class Bench {
   }
 
  private:
-  // Tells what has been called and logged since the last time.
+  // Adds the calls and log lines since the last time to the trace.
   void tellCalls() {
     const std::string called = transcript_.text();
     run_.told += called.substr(std::exchange(seen_, called.size()));
@@ -251,7 +251,7 @@ class Bench {
     std::string seen = left() + (returned ? probeTwice() : "");
     experiment_.reset();
     stream_.reset();
-    // A device that has gone leaves the loop in the next run.
+    // A removed device leaves the loop in the next run.
     (void)rawLoop_.runInMode(kRunLoopDefaultMode, std::chrono::nanoseconds(0), false);
     seen += left() + probeTwice();
     tellCalls();
@@ -269,7 +269,7 @@ class Bench {
     }
     return seen;
   }
-  // The next report, or error, that comes when the bench opens the sensor.
+  // The next report or error that the bench receives after it has opened the sensor.
   std::string probe() {
     const std::shared_ptr<HidManager> manager = phone_.platform().hid->createManager();
     manager->enumerateDevicesMatching({Dictionary{}});
@@ -303,7 +303,7 @@ class Bench {
   const SensorRequest& request_;
   const ErrorPlace place_;
   RunTranscript transcript_;
-  std::size_t seen_ = 0;  // of the transcript
+  std::size_t seen_ = 0;  // length of the transcript read so far
   SensorRun run_;
   SimulatedPhone phone_;
   VirtualScheduler& scheduler_;

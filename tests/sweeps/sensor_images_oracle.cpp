@@ -18,20 +18,20 @@ using Time = std::int64_t;
 constexpr Time kSecond = 1'000'000'000;
 constexpr Time kNever = std::numeric_limits<Time>::max();
 constexpr std::string_view kFailed = " -> failed";
-constexpr std::string_view kNeverReturned = "never returned: The simulated phone waits for ever: ";
+constexpr std::string_view kNeverReturned = "never returned: The simulated phone waits forever: ";
 
-// Thrown where a run breaks a rule: what follows cannot be read.
+// Thrown if a run breaks a rule, after which it cannot be parsed further.
 struct Broken {
   std::string rule;
 };
-// Thrown where the run tells that it never returned.
+// Thrown if the trace says that the run never returned.
 struct NeverReturned {
   std::string why;
 };
-// Thrown where the run can only raise.
+// Thrown if the run can only throw.
 struct Raises {};
 
-// A line of the run; of a call without its time.
+// A line of the trace; for a call, without its time.
 struct Line {
   std::string text;
   std::optional<Time> at;
@@ -65,7 +65,7 @@ std::vector<Line> linesOf(std::string_view text) {
   return lines;
 }
 
-// The number that the text begins with is taken away from it.
+// Removes the number at the beginning of the text.
 std::uint64_t takeNumber(std::string_view& text) {
   std::uint64_t number = 0;
   const auto [end, problem] = std::from_chars(text.data(), text.data() + text.size(), number);
@@ -102,7 +102,7 @@ const std::string& scans(std::uint64_t number) {
   return text;
 }
 
-// Reads a run line by line; what it got as answers says which line must be next.
+// Reads a run line by line; the results of earlier calls determine which line must be next.
 class Reader {
  public:
   Reader(const Known& known, const std::string& told) : known_(known), lines_(linesOf(told)) {}
@@ -117,7 +117,7 @@ class Reader {
       returned_ = false;
       readOutcome(errorIsUntouched_);
       const bool isEndless = known_.timeout > static_cast<std::uint64_t>(kNever / kSecond);
-      if (!end.why.ends_with(" hangs") && !isEndless) throw Broken{"the run waits for ever, and nothing hangs"};
+      if (!end.why.ends_with(" hangs") && !isEndless) throw Broken{"the run waits forever, and nothing hangs"};
     }
     expect("ended");
     if (next_ < lines_.size()) readAfterwards();
@@ -125,7 +125,7 @@ class Reader {
   }
 
  private:
-  // The next line, whose time is not before that of the one before it.
+  // The next line, whose time must not precede that of the previous line.
   const Line& peek() const {
     static const Line kNothing{"", std::nullopt, false};
     return next_ < lines_.size() ? lines_[next_] : kNothing;
@@ -146,13 +146,13 @@ class Reader {
   void readIfNeverReturned() {
     if (comes(kNeverReturned)) throw NeverReturned{take().text};
   }
-  // The next call is this one: whether it succeeded.
+  // Requires that the next call is this one, and returns whether it succeeded.
   bool call(const std::string& text) {
     readIfNeverReturned();
     return !expect(text).failed;
   }
 
-  // The place for an error after an outcome.
+  // The state of the error variable after an outcome.
   void readOutcome(bool isUntouched) {
     if (!known_.hasPlaceForError) {
       expect("no place for an error");
@@ -231,13 +231,13 @@ class Reader {
       isOpen_ = false;
     }
   }
-  // What the sensor sends is heard.
+  // Checks that inputs of the sensor may arrive.
   void hear() const {
     if (isSilent_) throw Broken{"something is heard of a sensor that has been closed"};
     if (!isScheduled_) throw Broken{"something is heard of a sensor that is not on the loop"};
   }
 
-  // What the run of the loop ended in.
+  // The result of the run of the loop.
   enum class End { kTimedOut, kStopped, kFinished };
   End readEndOfLoop(Time deadline) {
     const std::string text = take().text;
@@ -258,7 +258,7 @@ class Reader {
     return limit > kNever - now_ ? kNever : now_ + limit;
   }
 
-  // The run of the experiment: whether it has a result.
+  // The run of the experiment; returns whether it has a result.
   bool readCapture() {
     if (!readOpening()) return false;
     expect("RunLoop makeObserver of 268435455, repeating, order 0");
@@ -272,7 +272,7 @@ class Reader {
     if (end == End::kStopped && stops_ == 0 && !known_.othersUseTheLoop) throw Broken{"nobody stopped the loop"};
     return errors_ == 0;
   }
-  // Up to the end of the loop, with what is done when it exits.
+  // Up to the end of the loop, including the actions at its exit.
   void readReports() {
     for (;;) {
       if (comes("RunLoop stop")) {
@@ -326,7 +326,7 @@ class Reader {
       takeImage(list);
     }
     takeWord(list, ")");
-    // Every image from the last one that is wanted on stops the loop.
+    // The last requested image and every later one stop the loop.
     const std::uint64_t wanted = std::max<std::uint64_t>(known_.images, 1);
     if (stops_ != (count < wanted ? 0 : count - wanted + 1)) {
       throw Broken{std::to_string(count) + " images stopped the loop " + std::to_string(stops_) + " times"};
@@ -334,7 +334,7 @@ class Reader {
     if (count < wanted && wasScheduled_ && !known_.othersUseTheLoop) throw Broken{"there are too few images"};
   }
 
-  // An image: what the sensor put into its report, and no report left out since the one before.
+  // An image must have the content that the sensor sent, and no report may be missing since the previous one.
   void takeImage(std::string_view& text) {
     takeWord(text, "{frameID = ");
     const std::uint64_t frame = takeNumber(text);
@@ -389,14 +389,14 @@ class Reader {
     if (known_.receiver == Receiver::kCloses) readClosing();
   }
 
-  // What the run has left behind, and what is left when all of it has gone.
+  // The remains of the run before and after the experiment is released.
   void readAfterwards() {
     expect("left on the loop: " + std::to_string(isScheduled_ ? 1 : 0) + " sources, 0 observers");
     if (returned_) readProbes(isOpen_);
     expect("left on the loop: 0 sources, 0 observers");
     readProbes(false);
   }
-  // A sensor that nobody has open sends nothing between two probes.
+  // A sensor that is not open sends nothing between two probes.
   void readProbes(bool isOpen) {
     std::optional<std::uint64_t> last;
     for (int i = 0; i < 2; ++i) {
@@ -426,15 +426,15 @@ class Reader {
   Time now_ = 0;
 
   DueError due_;
-  bool errorIsUntouched_ = true;  // where the run never returns
+  bool errorIsUntouched_ = true;  // for a run that never returns
   bool returned_ = true;
   bool hasDevice_ = false;
   bool isOpen_ = false;
   bool isScheduled_ = false;
   bool wasScheduled_ = false;
   bool isSilent_ = false;
-  std::uint64_t stops_ = 0;   // of the loop, by the experiment
-  std::uint64_t errors_ = 0;  // of reports
+  std::uint64_t stops_ = 0;   // calls of stop() on the loop by the experiment
+  std::uint64_t errors_ = 0;  // errors received instead of reports
   std::optional<std::uint64_t> nextReport_;
   std::uint64_t lastMilliseconds_ = 0;
 };

@@ -1,7 +1,7 @@
-// What must hold of any capture of the display sensor's images, whatever goes wrong on the way: a run makes the calls,
-// ends and reports errors as the answers that it got demand.
+// Rules for every capture of the display sensor's images, with any failures: the results of earlier calls determine the
+// next calls, the end of the run and the reported errors.
 //
-// Nothing here knows the experiment, the stream, the platform or the simulated phone: it reads the text of a run.
+// It does not use the experiment, the stream, the platform or the simulated phone; it reads the trace of a run.
 #pragma once
 
 #include <cstdint>
@@ -10,34 +10,34 @@
 
 namespace quazor::sensor_oracle {
 
-// What the sensor puts into its images.
+// The content of the sensor's images.
 inline constexpr double kAmplitude = 1200;
 inline constexpr double kOffsetI = 40;
 inline constexpr double kOffsetQ = -25;
 inline constexpr double kPhaseStep = 7.5;        // degrees
-inline constexpr double kPhaseStepPerImage = 3;  // likewise
+inline constexpr double kPhaseStepPerImage = 3;  // the same
 inline constexpr const char* kCelsius = "36.6";
 
-// Who receives the images of a stream that is opened without an experiment.
+// The receiver of the images of a stream that is opened without an experiment.
 enum class Receiver { kExperiment, kNone, kListens, kCloses };
 
-// What is known of a run beforehand.
+// The facts about a run that are known in advance.
 struct Known {
   Receiver receiver = Receiver::kExperiment;
-  std::uint64_t images = 2;   // that are wanted
+  std::uint64_t images = 2;   // requested
   std::uint64_t timeout = 1;  // seconds
   bool hasPlaceForError = true;
-  bool othersUseTheLoop = false;          // there is another source on it, or it is stopped by somebody else
-  std::string displayProblem = {};        // what the display's property says against a run; empty: nothing
-  std::uint32_t firstFrameID = 1;         // of the report number 0
-  std::set<std::uint64_t> noImages = {};  // the numbers of reports that hold no image
-  std::set<std::string> errors = {};      // all that calls and reports can give, as text
+  bool othersUseTheLoop = false;          // another source is added to it, or it is stopped by another user
+  std::string displayProblem = {};        // why the display's property prevents a run; empty: it does not
+  std::uint32_t firstFrameID = 1;         // of report number 0
+  std::set<std::uint64_t> noImages = {};  // the numbers of reports without an image
+  std::set<std::string> errors = {};      // all errors that calls and reports can have, as text
   bool mayFailSilently = false;           // a call may fail without an error
-  bool startsInTime = true;               // nothing delays the calls: the first image is that of the first report
+  bool startsInTime = true;               // no call is delayed: the first image is that of the first report
 };
 
-// The first rule that a run breaks, `told` as tests/sweeps/sensor_images_bench.h tells it; the empty text when it
-// breaks none.
+// The first rule that a run breaks; empty if it breaks none. `told` is in the format of
+// tests/sweeps/sensor_images_bench.h.
 std::string brokenRule(const Known& known, const std::string& told);
 
 }  // namespace quazor::sensor_oracle

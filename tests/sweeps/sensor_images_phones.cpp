@@ -39,7 +39,7 @@ Scenario phone() {
   return scenario;
 }
 
-// That phone with a change to it.
+// A copy of the phone with a change.
 template <class Change>
 Scenario phoneWith(Change&& change) {
   Scenario scenario = phone();

@@ -1,4 +1,4 @@
-// The phones on which the capture of the display sensor's images is tried, and what is asked of each.
+// The phones for tests of image capture, and the requests for each of them.
 #pragma once
 
 #include "backends/simulated/scenario/scenario.h"
@@ -12,7 +12,7 @@
 
 namespace quazor {
 
-inline constexpr std::uint64_t kEndlessSeconds = 9223372037;  // more than the clock counts
+inline constexpr std::uint64_t kEndlessSeconds = 9223372037;  // beyond the range of the clock
 inline constexpr const char* kNoPowerState = "Could not find the display power state.";
 inline constexpr const char* kNotPowered = "The display is not powered.";
 
@@ -23,25 +23,25 @@ struct Request {
   OthersOnLoop others = {};
 };
 
-// One run on one phone.
+// A run on one phone.
 struct Sweep {
   const char* name;
   bool succeeds;
   Scenario phone;
   Request request = {};
   std::string displayProblem = {};  // as in sensor_oracle::Known
-  bool dependsOnSeed = false;       // a report is due with the end of the time
+  bool dependsOnSeed = false;       // a report is due at the timeout
 };
 inline void PrintTo(const Sweep& sweep, std::ostream* out) { *out << sweep.name; }
 
-// Every phone with what is asked of it.
+// All phones with their requests.
 const std::vector<Sweep>& sensorSweeps();
 
-// A phone whose sensor sends so many reports.
+// A phone whose sensor sends that many reports.
 Scenario withReports(std::uint64_t count);
-// A phone whose display's entry in the registry has these properties.
+// A phone whose display has these properties in its registry entry.
 Scenario withDisplay(const Dictionary& properties);
-// The properties of a display's entry in the registry, with that state of its panel's power.
+// The properties of a display's registry entry for a panel with that power state.
 Dictionary published(const Value& power);
 
 }  // namespace quazor

@@ -1,5 +1,5 @@
-// Makes every call of a capture of sensor images go wrong in every way, and every two calls, and holds each run to the
-// rules that any run keeps.
+// Makes every call and every pair of calls of a capture of sensor images go wrong in every way, and checks each run
+// with the rules.
 #include "backends/faults/operations.h"
 #include "backends/simulated/scenario/scenario.h"
 #include "tests/support/run_transcript.h"
@@ -29,7 +29,7 @@ using sensor_oracle::Known;
 using sensor_oracle::Receiver;
 using Nanoseconds = std::chrono::nanoseconds;
 
-// How a call goes wrong. No report is due when a delay ends, unless it is due with the end of the time.
+// The ways in which a call goes wrong. No report is due when a delay ends, except those due at the timeout.
 struct Kind {
   const char* name;
   FaultAction action;
@@ -42,7 +42,7 @@ const Kind kHangs{"hangs", FaultAction::kHang};
 const Kind kIsLate{"is late", FaultAction::kDelay, false, 62'300us};
 const Kind kIsVeryLate{"is very late", FaultAction::kDelay, false, 1'234'500us};
 
-// A call that goes wrong: the nth of the operation, or all.
+// A call that goes wrong: the nth of the operation, or all of them.
 struct Failure {
   Kind kind;
   std::optional<std::uint64_t> occurrence = {};
@@ -66,7 +66,7 @@ Fault faultOf(const Failure& failure) {
   return fault;
 }
 
-// The numbers of reports without an image, among the first ones.
+// The numbers of the first reports without an image.
 std::set<std::uint64_t> reportsWithoutImage(const HidDeviceConfig& sensor) {
   const auto holdsImage = [](const HidReportShape& shape) {
     return !shape.error && shape.reportID.value_or(0x76) == 0x76 && shape.length.value_or(792) >= 792;
@@ -90,7 +90,7 @@ Known knownOf(const Scenario& phone, const Request& request, const std::string& 
   known.errors = {"SensorErrorDomain code -536870174: The sensor does not answer.",
                   "SimulatedHidErrorDomain code 4: display-sensor has been removed.",
                   "SimulatedHidErrorDomain code 5: display-sensor has no feature report 0xAC.",
-                  "SimulatedHidErrorDomain code 6: Feature report 0xAB of display-sensor does not take the value 1."};
+                  "SimulatedHidErrorDomain code 6: Feature report 0xAB of display-sensor does not accept the value 1."};
   if (phone.hidDevices.empty()) return known;
   known.firstFrameID = phone.hidDevices.front().images.firstFrameID;
   known.noImages = reportsWithoutImage(phone.hidDevices.front());
@@ -99,7 +99,7 @@ Known knownOf(const Scenario& phone, const Request& request, const std::string& 
 
 constexpr std::array kPlaces{ErrorPlace::kGiven, ErrorPlace::kNone};
 
-// Runs and holds the runs to the rules.
+// Runs the phones and checks the runs with the rules.
 class Runs {
  public:
   Runs(Scenario phone, Request request, const std::string& displayProblem, Dictionary parameters)
@@ -118,7 +118,7 @@ class Runs {
 
   std::uint64_t cases() const { return cases_; }
 
-  // A run under a seed of its own.
+  // Performs and checks a run with a distinct seed.
   SensorRun check(const Failures& failures, ErrorPlace place) {
     std::vector<Fault> faults;
     Known known = known_;
@@ -142,7 +142,7 @@ class Runs {
     return run;
   }
 
-  // The same, under further seeds until each of the failures has happened once.
+  // The same, with further seeds until each of the failures has occurred once.
   SensorRun checkHappening(const Failures& failures, ErrorPlace place) {
     const std::vector<std::uint64_t> once(failures.size(), 1);
     SensorRun run;
@@ -155,7 +155,7 @@ class Runs {
   }
 
  private:
-  // No run takes longer than its timeout, what is late, and what others do with the loop.
+  // No run takes longer than its timeout plus the delays and the other uses of the loop.
   void expectInTime(const SensorRun& run, const Failures& failures) const {
     if (request_.timeout >= kEndlessSeconds) return;
     Nanoseconds longest = std::chrono::seconds(request_.timeout) + request_.others.source.value_or(0ns);
@@ -176,7 +176,7 @@ class SensorImagesSweep : public testing::TestWithParam<Sweep> {
  protected:
   void TearDown() override { std::cout << "[sweep] " << GetParam().name << ": " << runs.cases() << " cases\n"; }
 
-  // How many calls a run without failures makes.
+  // The number of calls in a run without failures.
   std::size_t calls() { return runs.check({}, ErrorPlace::kGiven).calls; }
 
   Runs runs{GetParam()};
@@ -202,7 +202,7 @@ TEST_P(SensorImagesSweep, EveryCallMayGoWrong) {
       ASSERT_FALSE(HasFailure());
     }
   }
-  // One more than there are does nothing.
+  // A failure after the last call has no effect.
   EXPECT_EQ(runs.check({{kFails, calls + 1}}, ErrorPlace::kGiven).fired, std::vector<std::uint64_t>{0});
 }
 
@@ -225,7 +225,8 @@ TEST_P(SensorImagesSweep, EveryOperationMayGoWrongAtEachOccurrenceAndAlways) {
 
 class SensorImagesSweepOfPairs : public SensorImagesSweep {};
 
-// The second one in the run that the first one leads to; when one of them only takes longer, they may meet one call.
+// The second failure is one in the run that results from the first. If one of them is only a delay, both may apply to
+// one call.
 TEST_P(SensorImagesSweepOfPairs, EveryTwoCallsMayGoWrong) {
   const std::pair<Kind, Kind> pairs[] = {{kAnswersNothing, kFails},
                                          {kAnswersNothing, kHangs},
@@ -248,7 +249,7 @@ TEST_P(SensorImagesSweepOfPairs, EveryTwoCallsMayGoWrong) {
 std::string nameOfSweep(const testing::TestParamInfo<Sweep>& sweep) { return sweep.param.name; }
 INSTANTIATE_TEST_SUITE_P(Phones, SensorImagesSweep, testing::ValuesIn(sensorSweeps()), nameOfSweep);
 
-// Without those that make the same calls in the same order as another one.
+// Omits phones whose runs make the same calls in the same order as those of another phone.
 std::vector<Sweep> sweepsOfPairs() {
   const std::set<std::string> likeAnother{"OneImage",
                                           "FiveImagesOfTheHealthyPhone",
@@ -275,7 +276,7 @@ std::vector<Sweep> sweepsOfPairs() {
 }
 INSTANTIATE_TEST_SUITE_P(Phones, SensorImagesSweepOfPairs, testing::ValuesIn(sweepsOfPairs()), nameOfSweep);
 
-// What the sensor sends after the run, since it could not be closed, finds nobody any more.
+// A sensor that could not be closed continues to send after the run, but there is no receiver.
 TEST(SensorImagesSweepOfTriples, ASensorThatCannotBeClosedTellsTheExperimentNothingAfterItsRun) {
   const std::set<std::string> names{"OneImage",   "TwoImages", "LastImageAtTheEndOfTheTime",
                                     "SharedLoop", "BusyLoop",  "LoopStopped"};
@@ -295,7 +296,7 @@ TEST(SensorImagesSweepOfTriples, ASensorThatCannotBeClosedTellsTheExperimentNoth
   std::cout << "[sweep] " << cases << " cases\n";
 }
 
-// A report that is due with the end of the time is in time or not, as the seed will have it.
+// Whether a report that is due at the timeout arrives in time depends on the seed.
 TEST(SensorImagesSweepOfSeeds, AReportAtTheEndOfTheTimeComesInTimeOrTooLate) {
   std::uint64_t cases = 0;
   for (const Sweep& sweep : sensorSweeps()) {

@@ -1,5 +1,5 @@
-// Makes every call of a report channel presence run fail, and takes the count from every choice of its channels, and
-// compares each run to the last word with what the oracle says it must be.
+// Makes every call of a report channel presence run fail, removes the count from every subset of its channels, and
+// compares the complete trace of each run with the oracle's prediction.
 #include "backends/simulated/scenario/scenario.h"
 #include "backends/simulated/simulated_phone.h"
 #include "diagnostics/report_channels/tessel_telemon_experiment.h"
@@ -59,7 +59,7 @@ class TelemonSweep : public testing::Test {
     }
   }
 
-  // Every failure there can be, none, and one behind the last call.
+  // All possible failures, no failure, and one after the last call.
   void checkEveryFailure(const Scenario& scenario) {
     for (const ErrorPlace place : {ErrorPlace::kGiven, ErrorPlace::kNone}) {
       for (std::size_t call = 0; call <= 3; ++call) {
@@ -89,7 +89,7 @@ TEST_F(TelemonSweep, EveryCallMayFailWhicheverChannelsHaveACount) {
   }
 }
 
-// Substring by substring: groups and subgroups that are almost the right ones.
+// Names of groups and subgroups that almost match.
 TEST_F(TelemonSweep, EveryCallMayFailWhateverTheGroupsAreCalled) {
   for (const char* const group : {"", "K42ISP", "K42IS", "42ISP", "xK42ISPx", "k42isp", "K42 ISP", "K42ISP Events"}) {
     for (const char* const subGroup :

@@ -1,18 +1,18 @@
-"""Reads the commands and excerpts in the fenced blocks of Markdown documents.
+"""Reads the commands and excerpts in the fenced code blocks of Markdown documents.
 
-A block whose language is `sh` holds commands, one a line; a line that ends with a backslash goes on in the next. Their
-first word is `./run` or `quazor`. A command ends with exit code 0, unless the comment behind it says `exit code N`.
+A block with the language `sh` contains commands, one per line; a backslash at the end of a line continues it. Their
+first word is `./run` or `quazor`. A command must end with exit code 0 unless its comment says `exit code N`.
 
-A `./test`, and what stands in a block that begins with
+`./test` and the commands in a block that begins with
 
     ```sh not run: REASON
 
-is not run. A block that begins with
+are not run. A block that begins with
 
     ```LANGUAGE from FILE
 
-is an excerpt of that file of the tree: its lines stand there in this order and without gaps, but for a line `...`.
-Indentation does not count.
+is an excerpt of that file in the tree: its lines must be in the file in this order and without gaps, except for a
+line `...`. Indentation is ignored.
 """
 
 import dataclasses
@@ -26,12 +26,12 @@ GAP = "..."
 
 
 class Problem(Exception):
-    """A block that does not keep to what stands above."""
+    """A block that violates these rules."""
 
 
 @dataclasses.dataclass(frozen=True)
 class Block:
-    """A fenced block: its first line's number, what stands behind the fence, and its lines."""
+    """A fenced block: its first line number, the text after the fence, and its lines."""
 
     line: int
     language: str
@@ -41,7 +41,7 @@ class Block:
 
 @dataclasses.dataclass(frozen=True)
 class Command:
-    """A command, without its comment. One with a `reason` is not to be run."""
+    """A command without its comment. One with a `reason` is not run."""
 
     line: int
     text: str
@@ -51,7 +51,7 @@ class Command:
 
 @dataclasses.dataclass(frozen=True)
 class Excerpt:
-    """Lines that stand in a file, which is named from the tree's root; each part is without gaps."""
+    """Lines in a file, whose path is relative to the root of the tree; each part has no gaps."""
 
     line: int
     file: str
@@ -78,7 +78,7 @@ def blocks(text):
 
 
 def split_comment(line):
-    """A command and the comment behind it, which may be empty."""
+    """A command and its comment, which may be empty."""
     quote = ""
     for at, character in enumerate(line):
         if quote:
@@ -91,7 +91,7 @@ def split_comment(line):
 
 
 def joined_lines(block):
-    """Numbers and texts of the block's lines, with lines joined that end with a backslash."""
+    """Numbers and texts of the block's lines; joins continued lines."""
     start, text = 0, ""
     for number, line in enumerate(block.lines, block.line + 1):
         start = start or number
@@ -105,7 +105,7 @@ def joined_lines(block):
 
 
 def reason_of(block):
-    """Why the block's commands are not run; empty when they are."""
+    """Why the commands of the block are not run; empty if they are."""
     if not block.rest:
         return ""
     reason = re.fullmatch(r"not run: (.+)", block.rest)
@@ -160,7 +160,7 @@ def excerpts(text):
 
 
 def is_in(excerpt, content):
-    """Whether the excerpt's parts stand in the file's content, one after the other."""
+    """True if the file contains the parts of the excerpt in this order."""
     lines = [line.strip() for line in content.splitlines()]
     at = 0
     for part in excerpt.parts:

@@ -1,5 +1,5 @@
 #!/usr/bin/env python3
-"""Feeds tests/tree/document_commands.py and tests/tree/documents_test.py small made-up documents."""
+"""Tests tests/tree/document_commands.py and tests/tree/documents_test.py with small documents."""
 
 import pathlib
 import subprocess
@@ -114,7 +114,7 @@ class ExcerptsTest(unittest.TestCase):
 
 
 class ProgramTest(unittest.TestCase):
-    """The whole program, on trees of one document. Its quazor ends with the exit code that is its first word."""
+    """Runs the complete program on trees with one document. The fake quazor exits with its first argument."""
 
     def run_on(self, *lines):
         with tempfile.TemporaryDirectory() as directory:

@@ -1,12 +1,12 @@
 #!/usr/bin/env python3
-"""Runs the commands of every document of the tree, and compares its excerpts of source files with the files.
+"""Runs the commands of every document in the tree, and compares its excerpts with the source files.
 
 usage: documents_test.py ROOT PROGRAM PLUGIN...
 
-What a document has to keep to stands in document_commands.py. The commands of one document run one after the other in
-a directory of their own that looks like the tree after its program and the PLUGINs were built: what one writes the next
-may read. Commands that are not run are listed with the reason. Exit code 0: all is as the documents say; 1: something
-is not.
+document_commands.py describes the rules for documents. The commands of a document run in order in a
+directory that looks like the tree after its program and the PLUGINs were built; a command may read files that an
+earlier one has written. Lists the commands that are not run and the reasons. Exit code 0: everything agrees with the
+documents; 1: something does not.
 """
 
 import concurrent.futures
@@ -19,8 +19,8 @@ import tempfile
 import document_commands
 from document_commands import Problem
 
-TIME_LIMIT = 120  # seconds, for a command
-LINES_SHOWN = 20  # of the output of one that ended otherwise than it should
+TIME_LIMIT = 120  # seconds per command
+LINES_SHOWN = 20  # of the output of a command with an unexpected result
 
 RUN = """#!/bin/sh
 [ $# -gt 0 ] || set -- run --all
@@ -29,7 +29,7 @@ exec quazor "$@"
 
 
 def documents(root):
-    """The tree's documents, without those of builds."""
+    """The documents of the tree, without those in build directories."""
     files = sorted(root.rglob("*.md"))
     parts = {file: file.relative_to(root).parts for file in files}
     return [file for file in files if not parts[file][0].startswith("build") and
@@ -48,7 +48,7 @@ def lay_out(directory, root, program, plugins):
         folder.mkdir(parents=True)
     (programs / "quazor").symlink_to(program)
     for plugin in plugins:
-        # Those of the tree stand where they are built, one's own in the directory where it is.
+        # Plug-ins of the tree are in the directory of its build, others in the current directory.
         (installed / plugin.name).symlink_to(plugin)
         (directory / "build" / plugin.name).symlink_to(plugin)
     path = f"{programs}{os.pathsep}{os.environ['PATH']}"
@@ -56,7 +56,7 @@ def lay_out(directory, root, program, plugins):
 
 
 def outcome(command, directory, environment):
-    """What is wrong with the command's end; nothing when it is as the document says."""
+    """Describes an unexpected result of the command; empty if the result is as documented."""
     try:
         run = subprocess.run(
             ["bash", "-euo", "pipefail", "-c", command.text], cwd=directory, env=environment, stdin=subprocess.DEVNULL,
@@ -71,7 +71,7 @@ def outcome(command, directory, environment):
 
 
 def check_excerpts(name, text, root):
-    """The excerpts that do not stand in their files, as sentences."""
+    """The excerpts that are not in their files, as sentences."""
     found = []
     for excerpt in document_commands.excerpts(text):
         file = root / excerpt.file
@@ -83,7 +83,7 @@ def check_excerpts(name, text, root):
 
 
 def check(document, root, program, plugins):
-    """Problems of a document, notes on what was not run, and how many commands were run."""
+    """The problems of a document, notes on commands that were not run, and the number of commands run."""
     name = str(document.relative_to(root))
     text = document.read_text(encoding="utf-8")
     try:

@@ -1,15 +1,15 @@
-"""Collects from C++ sources the errors that they can return: domain, code, the code's name, and the message's format.
+"""Collects the errors that C++ sources can return: domain, code, the code's name, and the message's format.
 
-Everything that makes an error, and every mention of an error domain, must be of a form that is known here. Any other
-raises UnknownForm, so that no error is passed over:
+Everything that creates an error, and every mention of an error domain, must have a known form. Any other
+raises UnknownForm, so that no error is overlooked:
 
     fail(out, DOMAIN, CODE, underlying, FORMAT, ...)     makeError(DOMAIN, CODE, FORMAT, ...)
     errorWithMessage(DOMAIN, CODE, MESSAGE, underlying)
 
 DOMAIN is a constant whose name ends in ErrorDomain. CODE is an integer, a constant of the same file or of a namespace
-that is named with it, an enumerator, or static_cast<std::int64_t>(...) of one. CODE and FORMAT may be parameters of the
-function that the call is in: then every call of that function is an error. A CODE that is a parameter of the type of an
-enumeration stands for every enumerator of it that the sources mention.
+named in the expression, an enumerator, or static_cast<std::int64_t>(...) of one. CODE and FORMAT may be parameters of
+the enclosing function: then every call of that function is an error. A CODE that is a parameter of an enumeration type
+stands for every enumerator that the sources mention.
 """
 
 import dataclasses
@@ -17,9 +17,9 @@ import pathlib
 import re
 
 MAKERS = {"fail": (1, 2, 4, 5), "makeError": (0, 1, 2, 3), "errorWithMessage": (0, 1, 2, 4)}  # ..., fewest arguments
-# They declare and define the functions above.
+# These files declare and define the functions above.
 MAKERS_FILES = {"contract/diagnostic_error.h", "contract/diagnostic_error.cpp"}
-# It makes the errors anew that a record of a run holds.
+# This file recreates errors from a record.
 COPIERS = {"host/record/lossless_json.cpp"}
 
 TOKEN = re.compile(
@@ -35,12 +35,12 @@ OPEN = {"(": ")", "{": "}", "[": "]"}
 
 
 class UnknownForm(Exception):
-    """The sources return an error in a way that this module cannot follow."""
+    """The sources return an error in a way that this module does not support."""
 
 
 @dataclasses.dataclass(frozen=True)
 class Error:
-    """An error that a source file can return; `message` is None when it is not one format alone."""
+    """An error that a source file can return; `message` is None if it is not a single format."""
     file: str
     domain: str
     code: int
@@ -59,11 +59,11 @@ class Token:
 class Function:
     name: str
     parameters: list  # of lists of tokens
-    begin: int  # of the body, in the file's tokens
+    begin: int  # of the body, as an index of the file's tokens
     end: int
 
     def position_of(self, argument):
-        """Which parameter the argument is, or None."""
+        """The index of the parameter that the argument is, or None."""
         if len(argument) == 1 and argument[0].kind == "name":
             for position, parameter in enumerate(self.parameters):
                 if parameter and parameter[-1].text == argument[0].text:
@@ -82,7 +82,7 @@ def tokens_of(text):
 
 
 def closing(tokens, at):
-    """Where the bracket that opens at `at` closes."""
+    """The index of the bracket that closes the one at `at`."""
     depth = 0
     for position in range(at, len(tokens)):
         if tokens[position].kind == "mark":
@@ -94,13 +94,13 @@ def closing(tokens, at):
 
 
 def split(tokens):
-    """The arguments between two brackets. Commas in template arguments of a type do not count."""
+    """The arguments between two brackets. Commas in template arguments of a type do not separate them."""
     parts, depth, angles = [[]], 0, 0
     for position, token in enumerate(tokens):
         if token.kind == "mark":
             depth += token.text in OPEN
             depth -= token.text in OPEN.values()
-            # A "<" that a ">" follows is taken for the bracket of a template's arguments.
+            # A "<" that is followed by a ">" counts as the bracket of template arguments.
             angles += token.text == "<" and ">" in [other.text for other in tokens[position:]]
             angles -= token.text == ">" and angles > 0
         if token.text == "," and token.kind == "mark" and depth == 0 and angles == 0:
@@ -111,7 +111,7 @@ def split(tokens):
 
 
 class Source:
-    """One file's tokens, functions and constants."""
+    """The tokens, functions and constants of one file."""
 
     def __init__(self, name, text):
         self.name = name
@@ -144,7 +144,7 @@ class Source:
             position += 1
 
     def _braces(self, scope, head, begin, close):
-        """Reads what stands between braces at namespace or class level; where the next declaration's head begins."""
+        """Reads the contents of braces at namespace or class level; returns where the next declaration begins."""
         header = self.tokens[head:begin]
         words = [token.text for token in header]
         for keyword in ("enum", "namespace", "class", "struct", "union", "extern"):
@@ -167,7 +167,7 @@ class Source:
             if "=" not in words[:opening]:
                 self.functions.append(Function(name.split("::")[-1], parameters, begin, close))
                 return close + 1
-        return head  # an initialiser: its declaration goes on
+        return head  # an initialiser: its declaration continues
 
     def _enumeration(self, scope, begin, close):
         if not scope:
@@ -197,13 +197,13 @@ class Source:
 
 
 def integer(tokens):
-    """The integer that the tokens write down, or None."""
+    """The integer that the tokens form, or None."""
     text = "".join(token.text for token in tokens).replace("'", "")
     return int(text, 0) if re.fullmatch(r"-?(0x[0-9a-fA-F]+|0|[1-9]\d*)", text) else None
 
 
 def format_of(tokens):
-    """The text that literals side by side make, or None."""
+    """The text of adjacent string literals, or None."""
     if not tokens or any(token.kind != "text" for token in tokens):
         return None
     return "".join(token.text[1:-1] for token in tokens).replace('\\"', '"')
@@ -241,7 +241,7 @@ class Collector:
         arguments, begin = call
         domain, code, message, fewest = MAKERS[maker]
         if len(arguments) < fewest:
-            if maker == "fail":  # the function of that name has more arguments: this is another one
+            if maker == "fail":  # a function named `fail` with fewer arguments is another one
                 return []
             raise UnknownForm(f"{source.at(position)}: {maker} with {len(arguments)} arguments")
         if self._is_passed_on(source, arguments[domain], arguments[code]):
@@ -254,14 +254,14 @@ class Collector:
 
     @staticmethod
     def _is_passed_on(source, domain, code):
-        """A scenario's error: its author chose domain and code."""
+        """An error of a scenario, whose author chose domain and code."""
         texts = ["".join(token.text for token in argument) for argument in (domain, code)]
         return (source.name.startswith(("backends/faults/", "backends/simulated/")) and texts[0].endswith(".error->domain")
                 and texts[1] == texts[0][:-len("domain")] + "code")
 
     @staticmethod
     def _call(source, position):
-        """The arguments of a call of the name at the position and where they begin, or None where it is no call."""
+        """The arguments of a call of the name at the position and where they begin, or None if it is not a call."""
         tokens, opening = source.tokens, position + 1
         if tokens[opening].text == "<":
             while tokens[opening].text != ">":
@@ -290,7 +290,7 @@ class Collector:
         for caller, place, arguments in self._calls_of(source, function):
             there = arguments[code_parameter] if code_parameter is not None else None
             text = arguments[message_parameter] if message_parameter is not None else message
-            if there is None:  # the code stands here, the message there
+            if there is None:  # the code is here, the message at the call
                 value, symbol = self._constant(source, position, code)
                 found.append(Error(source.name, domain, value, symbol, format_of(text)))
             else:
@@ -341,7 +341,7 @@ class Collector:
         raise UnknownForm(f"{source.at(position)}: '{text}' is no code that can be followed")
 
     def _check_mentions(self, source):
-        """A mention of a domain that is neither its definition, nor in a call that is known, nor a comparison."""
+        """A mention of a domain that is not its definition, a known call or a comparison."""
         definitions = {position for _, position in source.domains.values()}
         for position, token in enumerate(source.tokens):
             is_domain = token.kind == "text" and re.fullmatch(r'".+ErrorDomain"', token.text)

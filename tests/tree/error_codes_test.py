@@ -1,5 +1,5 @@
 #!/usr/bin/env python3
-"""Feeds tests/tree/error_codes.py small made-up trees, one per form of returning an error."""
+"""Tests tests/tree/error_codes.py with small trees, one per form of returning an error."""
 
 import pathlib
 import tempfile
@@ -20,7 +20,7 @@ def in_tree(files, call):
 
 
 def errors_in(body, **more):
-    """The errors of a tree whose lamp/lamp.cpp holds `body`, without their file's names."""
+    """The errors of a tree whose lamp/lamp.cpp contains `body`, without the file names."""
     files = {"contract/diagnostic_error.h": "#pragma once\n" + DOMAIN, "lamp/lamp.cpp": body}
     files.update({name.replace("__", "/") + ".h": text for name, text in more.items()})
     folders = sorted({name.split("/")[0] for name in files})

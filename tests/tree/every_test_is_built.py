@@ -1,10 +1,10 @@
 #!/usr/bin/env python3
-"""Checks that every test file on disk is named by a CMakeLists.txt of its folder or of a folder above it.
+"""Checks that a CMakeLists.txt in the same or a parent folder names every test file.
 
     every_test_is_built.py [ROOT]
 
-A test file is `*_test.cpp` or `*_test.py`. A name in a comment does not count. Exits with 1 and a line per file
-that is left out.
+A test file is `*_test.cpp` or `*_test.py`. A name in a comment does not count. Exits with 1 and prints a line per
+missing file.
 """
 
 import pathlib
@@ -16,7 +16,7 @@ TOKEN = re.compile(r'[^\s()"]+')
 
 
 def named_files(cmake_lists):
-    """The files of the tree that a CMakeLists.txt names, as absolute paths."""
+    """The files that a CMakeLists.txt names, as absolute paths."""
     folder = cmake_lists.parent
     lines = cmake_lists.read_text(encoding="utf-8").splitlines()
     text = "\n".join(line.split("#", 1)[0] for line in lines)
@@ -30,7 +30,7 @@ def is_ours(path, root):
 
 
 def tests_left_out(root):
-    """The test files that no CMakeLists.txt names, and how many test files there are."""
+    """The test files that no CMakeLists.txt names, and the number of test files."""
     named = set()
     for cmake_lists in root.rglob("CMakeLists.txt"):
         if is_ours(cmake_lists, root):

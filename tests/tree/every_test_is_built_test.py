@@ -1,5 +1,5 @@
 #!/usr/bin/env python3
-"""Feeds tests/tree/every_test_is_built.py small made-up trees."""
+"""Tests tests/tree/every_test_is_built.py with small trees."""
 
 import pathlib
 import tempfile

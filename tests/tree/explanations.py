@@ -1,12 +1,12 @@
 #!/usr/bin/env python3
-"""Checks the explanations of `quazor explain` against what they explain.
+"""Checks that the explanations of `quazor explain` agree with the program.
 
 usage: explanations.py ROOT PROGRAM PLUGIN
 
-ROOT is the source tree. Its sources tell the errors that the plug-ins, the host and the backends can return, and the
-names that the plug-ins register. PROGRAM runs all of that, the experiments of PLUGIN too, for the names of results.
-Each error and each name must have an explanation, each explanation must be of something that there is, and the messages
-must be those of the sources. Exit code 0: all is so; 1: something is not.
+ROOT is the source tree, from which the possible errors of the plug-ins, the host and the backends and the registered
+names are collected. PROGRAM runs everything, including the experiments of PLUGIN, for the names of results.
+Each error and each name must have an explanation, each explanation must belong to an existing error or name, and the
+messages must be those of the sources. Exit code 0: everything agrees; 1: something does not.
 """
 
 import json
@@ -20,7 +20,7 @@ import jsonschema
 
 import error_codes
 
-# The folders of the plug-ins, and the diagnostics and experiments whose errors they make.
+# The folders of the plug-ins, and the diagnostics and experiments that return their errors.
 PLUGIN_FOLDERS = {
     "diagnostics/camera_sync": {"CameraSyncDiagnostic.Back", "CameraSyncDiagnostic.Front"},
     "diagnostics/projector_fault": {"TesselFaultDiagnostic"},
@@ -31,11 +31,11 @@ CATALOGUE_FOLDERS = ["plugins", *PLUGIN_FOLDERS]
 ALL_FOLDERS = ["contract", "platform", "base", "diagnostics", "plugins", "backends", "host"]
 
 PLACEHOLDER = re.compile(r"%(?:@|lu|lf|d)")
-IN_CAPITALS = re.compile(r"[A-Z :]+")  # NAME, DOMAIN:CODE: for the reader to fill in
+IN_CAPITALS = re.compile(r"[A-Z :]+")  # placeholders such as NAME and DOMAIN:CODE
 
 
 def read(folder):
-    """The entries of all files, and what is wrong with the files."""
+    """The entries of all files, and the problems of the files."""
     validator = jsonschema.Draft202012Validator(
         json.loads((folder / "explanations.schema.json").read_text(encoding="utf-8")))
     entries, found = [], []
@@ -56,7 +56,7 @@ def name_of(entry):
 
 
 def message_problems(entry, errors):
-    """The messages of a plug-in's error, and who gives them."""
+    """The messages of a plug-in's error, and the diagnostics that return them."""
     returned = {}
     for error in errors:
         folder = str(pathlib.PurePosixPath(error.file).parent)
@@ -95,7 +95,7 @@ def error_problems(entries, errors):
 
 
 def name_problems(entries, registered, results):
-    """`registered` has lists of names by kind; `results` has sets of names by the diagnostic or experiment."""
+    """`registered` has lists of names by kind; `results` has sets of names by diagnostic or experiment."""
     found = []
     wanted = {name: kind for kind, names in registered.items() for name in names}
     senders = {}
@@ -125,7 +125,7 @@ def texts_of(value):
 
 
 def command_problems(entries):
-    """Commands in the texts must ask for what there is."""
+    """Checks that the commands in the texts refer to existing errors and names."""
     keys = {name_of(entry) for entry in entries if "domain" in entry}
     names = {name: entry["kind"] for entry in entries for name in entry.get("names", [])}
     kinds = {"run": {"diagnostic"}, "experiment": {"experiment"}, "describe": {"diagnostic", "experiment"},
@@ -149,7 +149,7 @@ def command_problems(entries):
 
 
 def results_of(program, plugin):
-    """The names of what the diagnostics and the experiments measure on the healthy phone, by their names."""
+    """The names of the results of all diagnostics and experiments on the healthy phone."""
     results = {}
     runs = {"diagnostics": ["run", "--all"], "experiments": ["experiment", "--all", "--plugin", plugin]}
     for kind, command in runs.items():

@@ -1,5 +1,5 @@
 #!/usr/bin/env python3
-"""Feeds tests/tree/explanations.py small made-up explanations: each kind of problem is found, and nothing else is."""
+"""Tests tests/tree/explanations.py with small explanations: it finds each kind of problem and nothing else."""
 
 import copy
 import json

@@ -1,5 +1,5 @@
 #!/usr/bin/env python3
-"""Checks that every folder is described, and that none grows beyond what a reader can survey.
+"""Checks that every folder has a README, and that folders and files do not become too large.
 
     folders.py [ROOT]
 
@@ -7,14 +7,14 @@
     a CMakeLists.txt, unless BUILT_ABOVE lists it.
   - A folder that holds C++, and each of DESCRIBED, has a README.md: a title, an empty line, and the five lines of
     LINES in that order. A document may follow after an empty line.
-  - The line "What it may include" agrees with the folder's row: what it names, `folder/`, is of the row, above such a
-    folder, or the folder itself; and each folder of the row is named, or one above it is.
-  - What the five lines name in `back quotes` is there: a file (`name.h`), somewhere in the tree, and a class or a function
-    (`ClassName`, `name()`), in some source.
-  - A folder holds at most MAX_FILES source files (*.h and *.cpp; tests beside the code do not count), and a source file
-    has at most MAX_LINES lines (Python programs of the tree too).
+  - The line "What it may include" agrees with the folder's row: each `folder/` that it names is in the row, above a
+    folder of the row, or the folder itself; and for each folder in the row, that folder or one above it is named.
+  - The names in `back quotes` in the five lines exist: a file (`name.h`) somewhere in the tree, a class or function
+    (`ClassName`, `name()`) in some source.
+  - A folder contains at most MAX_FILES source files (*.h and *.cpp, except tests), and a source file
+    at most MAX_LINES lines (including Python programs).
 
-Exits with 1 and a line per violation.
+Exits with 1 and prints a line per violation.
 """
 
 import pathlib
@@ -27,14 +27,14 @@ MAX_FILES = 40
 MAX_LINES = 500
 LINES = ("What happens here", "What comes in", "What goes out", "What it may include", "Threads")
 
-# Folders without C++ of their own that a newcomer looks into.
+# Folders without C++ sources that need a README.
 DESCRIBED = ["backends", "base", "benchmarks", "cmake", "data", "data/bindings", "data/explanations", "data/profiles",
              "data/scenarios", "diagnostics", "docs", "examples", "host", "packaging", "tests", "tests/tree"]
-# Folders whose sources a CMakeLists.txt above them names.
+# Folders whose sources are listed in a CMakeLists.txt above them.
 BUILT_ABOVE = ["tests/compile_failures", "tests/misbehaving"]
-# Folders that may include nearly all; nobody wants to read which.
+# Folders that may include nearly everything, so their README does not list it.
 NOT_LISTED = ["tests", "benchmarks"]
-# Examples have a README of their own: they are documents for people who see nothing else of the tree.
+# Examples have a different kind of README: a document for users who do not see the rest of the tree.
 SELF_DESCRIBED = "examples/"
 
 NAMED_FILE = re.compile(r"`([\w./-]+\.(?:h|cpp|py|json|cmake|sh|md))`")
@@ -48,7 +48,7 @@ def is_ours(path, root):
 
 
 def folders_with_sources(root):
-    """Folder -> its C++ files."""
+    """The C++ files by folder."""
     folders = {}
     for path in include_directions.sources(root):
         folders.setdefault(str(path.parent), []).append(path)
@@ -70,7 +70,7 @@ def is_below(folder, above):
 
 
 def row_of(folder, rows):
-    """What a folder's README may name: of a folder without a row, what the folders below it may include."""
+    """What a folder's README may name; for a folder without a row, what the folders below it may include."""
     for above in ("tests", "benchmarks", "examples"):
         if folder.startswith(above + "/"):
             return [folder, above, *rows.get(above, [])]
@@ -81,7 +81,7 @@ def row_of(folder, rows):
 
 
 def check_readme(root, folder, rows, files, words):
-    """What is wrong with a folder's README, as a list of sentences."""
+    """The problems of a folder's README, as a list of sentences."""
     readme = root / folder / "README.md"
     if not readme.is_file():
         return [f"{folder}/ has no README.md"]

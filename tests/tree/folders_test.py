@@ -1,5 +1,5 @@
 #!/usr/bin/env python3
-"""Feeds tests/tree/folders.py small made-up trees, one per rule, and checks that the tree's own folders are named rightly."""
+"""Tests tests/tree/folders.py with small trees, one per rule, and checks that the folders it names exist."""
 
 import pathlib
 import tempfile

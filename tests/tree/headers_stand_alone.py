@@ -1,11 +1,11 @@
 #!/usr/bin/env python3
-"""Compiles each header alone, as the first and only include of a source file, and twice over.
+"""Compiles each header by itself, as the first and only include of a source file, included twice.
 
     headers_stand_alone.py --compiler CXX --root INCLUDE_ROOT FOLDER...
     headers_stand_alone.py --compiler CXX --self-test
 
-Checks every `*.h` in the folders under the include root as C++20 with warnings as errors. Exits with 1 and the
-compiler's words for every header that needs an include before it.
+Checks every `*.h` in the folders under the include root as C++20 with warnings as errors. Exits with 1 and prints the
+compiler's messages for every header that depends on an earlier include.
 """
 
 import argparse
@@ -20,14 +20,14 @@ JOBS = 2
 
 
 def compile_alone(compiler, root, header):
-    """The compiler's complaints about a header that is named from the root; empty when it has none."""
+    """The compiler's messages about a header, whose path is relative to the root; empty if there are none."""
     source = f'#include "{header}"\n#include "{header}"\n'
     result = subprocess.run([compiler, "-I", root, *FLAGS], input=source, capture_output=True, text=True, check=False)
     return "" if result.returncode == 0 else result.stderr or "the compiler failed without a word"
 
 
 def faults(compiler, root, folders):
-    """Headers to complaints, for those that do not stand alone; and how many headers there are."""
+    """The messages for the headers that do not compile by themselves, and the number of headers."""
     headers = [path.relative_to(root) for folder in folders for path in sorted((root / folder).rglob("*.h"))]
     with concurrent.futures.ThreadPoolExecutor(JOBS) as pool:
         complaints = list(pool.map(lambda header: compile_alone(compiler, root, header), headers))
@@ -35,7 +35,7 @@ def faults(compiler, root, folders):
 
 
 def self_test(compiler):
-    """Two headers of which one leans on the other: only that one is a fault. Returns an exit code."""
+    """Tests this program with two headers, one of which depends on the other. Returns an exit code."""
     headers = {
         "sound.h": "#pragma once\n#include <string>\nstd::string name();\n",
         "leaning.h": "#pragma once\nstd::string name();\n",

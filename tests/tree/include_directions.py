@@ -1,20 +1,20 @@
 #!/usr/bin/env python3
-"""Checks which folder includes which.
+"""Checks the include directions between folders.
 
     include_directions.py [ROOT]
 
-Every folder shares one include root, so the compiler cannot refuse a wrong include; this does. The rules:
+Every folder shares one include root, so the compiler cannot reject a wrong include; this program does. The rules:
 
   - `#include "..."` names a file of the tree, written from its root.
   - A folder includes itself and the folders that ALLOWED lists for it, no others. A folder that is not listed there
     may hold no C++ at all. ALLOWED has no cycle.
   - contract/, platform/, base/text/ and the diagnostics include the standard library and nothing else from outside.
   - Tests (`*_test.cpp`, `*_fuzz.cpp`, `*_for_tests.h`, `*_conformance.h`) may include any library, the helpers in
-    tests/support/ and, beyond what their folder may, what TEST_ALLOWED lists. What is no test includes no test's
-    header.
-  - tests/ and benchmarks/ may include everything; examples/ what is installed.
+    tests/support/ and, in addition to what their folder may, what TEST_ALLOWED lists. Other files must not include a
+    header of a test.
+  - tests/ and benchmarks/ may include everything; examples/ the installed headers.
 
-Exits with 1 and a line per violation.
+Exits with 1 and prints a line per violation.
 """
 
 import pathlib
@@ -25,7 +25,7 @@ CONTRACT = ["contract", "platform"]
 DIAGNOSTICS = ["diagnostics/camera_sync", "diagnostics/projector_fault", "diagnostics/report_channels",
                "diagnostics/sensor_images"]
 
-# A row a folder: what its own sources may include beside those of the folder itself.
+# One row per folder: what its sources may include in addition to the folder itself.
 SIMULATED = "backends/simulated/"
 LINUX = "backends/linux/"
 ALLOWED = {
@@ -99,7 +99,7 @@ ALLOWED["benchmarks"] = [*ALLOWED["tests"], "tests"]
 
 STANDARD_LIBRARY_ONLY = [*CONTRACT, "base/text", *DIAGNOSTICS]
 
-# What the tests below a folder may include beyond its rows.
+# What the tests below a folder may include in addition to its row.
 TEST_ALLOWED = {
     "diagnostics": BACKENDS,
     "plugins": BACKENDS,
@@ -129,7 +129,7 @@ TARGET = re.compile(r'^(?:"([^"]+)"|<([^>]+)>)')
 
 
 def sources(root):
-    """Every C++ file of the tree, as paths from its root; what is built or hidden is passed over."""
+    """Every C++ file of the tree, as paths from its root; skips build and hidden directories."""
     for path in sorted(root.rglob("*")):
         names = path.relative_to(root).parts
         if path.suffix not in SOURCE_SUFFIXES or not path.is_file():
@@ -140,7 +140,7 @@ def sources(root):
 
 
 def folder_of(path):
-    """The folder of ALLOWED that a file belongs to, or None."""
+    """The folder in ALLOWED that a file belongs to, or None."""
     folder = str(path.parent)
     whole = [above for above in ("tests", "benchmarks", "examples") if folder == above or folder.startswith(above + "/")]
     return whole[0] if whole else folder if folder in ALLOWED else None
@@ -161,7 +161,7 @@ def allowed_folders(path, folder):
 
 
 def cycle_in(rows):
-    """Folders that include each other by the rows, as a list that ends where it begins; empty when there are none."""
+    """Folders whose rows form a cycle, as a list that ends where it begins; empty if there is none."""
     done, way = set(), []
 
     def visit(folder):
@@ -185,7 +185,7 @@ def cycle_in(rows):
 
 
 def check_own_header(root, path, folder, target):
-    """What is wrong with `#include "target"`, or None."""
+    """The problem of `#include "target"`, or None."""
     if ".." in pathlib.PurePosixPath(target).parts or not (root / target).is_file():
         return f'"{target}" is no file of the tree; includes are written from its root'
     if is_test(pathlib.PurePosixPath(target)) and not is_test(path) and folder not in TEST_FOLDERS:
@@ -197,7 +197,7 @@ def check_own_header(root, path, folder, target):
 
 
 def check_line(root, path, folder, line):
-    """What is wrong with the line, or None."""
+    """The problem of the line, or None."""
     include = INCLUDE.match(line)
     if include is None:
         return None
@@ -213,7 +213,7 @@ def check_line(root, path, folder, line):
 
 
 def violations(root):
-    """One line per include that breaks the rules, and per file in a folder that has none."""
+    """One line per include that breaks the rules, and per file in a folder without a row."""
     cycle = cycle_in(ALLOWED)
     found = [f"a cycle of folders: {' -> '.join(cycle)}"] if cycle else []
     for path in sources(root):

@@ -1,5 +1,5 @@
 #!/usr/bin/env python3
-"""Feeds tests/tree/include_directions.py small made-up trees, one per rule."""
+"""Tests tests/tree/include_directions.py with small trees, one per rule."""
 
 import pathlib
 import subprocess

@@ -1,4 +1,4 @@
-"""The manual page and the program's own help name the same commands and options.
+"""Checks that the manual page and the program's help have the same commands and options.
 
 usage: man_page_test.py PROGRAM MAN_PAGE
 """

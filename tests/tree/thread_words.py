@@ -1,21 +1,21 @@
 #!/usr/bin/env python3
-"""Checks that every class of a product header says which threads may use it.
+"""Checks that every class of a product header documents which threads may use it.
 
     thread_words.py [ROOT]
 
-The comment directly above the class, or above its `template` line, holds a line that begins with `// Thread: `. What
-follows is "any" (several threads at once), "one at a time" (any thread, but never two), or who: "the loop's", "as
-SerialQueue". More may follow it.
+The comment directly above the class, or above its `template` line, must contain a line that begins with `// Thread: `,
+followed by "any" (several threads at once), "one at a time" (any thread, but never two), or a thread: "the loop's", "as
+SerialQueue". More text may follow.
 
-  - Product headers are the *.h files of the tree but for those of tests/, benchmarks/, examples/ and host/testing/ and
-    for `*_for_tests.h`, `*_conformance.h` and `*_fixture.h`.
-  - A class is what `class` or `struct` defines at namespace scope. What is defined inside a class is used as that class
-    is, and may say so otherwise.
-  - A struct that is data needs no line: it has no base class, and every member function that it has is const, static,
-    defaulted or deleted, or a friend.
-  - An exception needs none either: a class with a base whose name ends in Error, _error or exception.
+  - Product headers are the *.h files of the tree except those in tests/, benchmarks/, examples/ and host/testing/, and
+    except `*_for_tests.h`, `*_conformance.h` and `*_fixture.h`.
+  - A class is what `class` or `struct` defines at namespace scope. A nested class follows the rule of the outer class
+    unless it says otherwise.
+  - A plain data struct needs no line: it has no base class, and all its member functions are const, static,
+    defaulted, deleted or friends.
+  - Nor does an exception: a class with a base whose name ends in Error, _error or exception.
 
-Exits with 1 and a line per violation.
+Exits with 1 and prints a line per violation.
 """
 
 import pathlib
@@ -25,7 +25,7 @@ import sys
 OTHER_FOLDERS = ("tests/", "benchmarks/", "examples/", "host/testing/", "build")
 OTHER_NAMES = ("_for_tests.h", "_conformance.h", "_fixture.h")
 
-# Comments and literals, which are blanked out so that what is left is code.
+# Comments and literals, which are blanked out so that only code is left.
 NO_CODE = re.compile(r'//[^\n]*|/\*.*?\*/|R"(\w*)\(.*?\)\1"|"(?:\\.|[^"\\\n])*"|\'(?:\\.|[^\'\\\n])+\'', re.DOTALL)
 DIRECTIVE = re.compile(r"^[ \t]*#(?:[^\n\\]|\\\n|\\.)*", re.MULTILINE)
 # `class QUAZOR_EXPORT Name final : public Base {`
@@ -40,12 +40,12 @@ def blank(match):
 
 
 def code_of(text):
-    """The text with everything blanked that is no code; every character stays in its place."""
+    """The text with everything but code blanked out; positions do not change."""
     return DIRECTIVE.sub(blank, NO_CODE.sub(blank, text))
 
 
 def end_of_block(code, start):
-    """The place after the brace that closes the one before `start`."""
+    """The position after the brace that closes the one before `start`."""
     depth = 1
     for place in range(start, len(code)):
         depth += {"{": 1, "}": -1}.get(code[place], 0)
@@ -55,7 +55,7 @@ def end_of_block(code, start):
 
 
 def classes(code):
-    """The classes that are defined at namespace scope: (keyword, name, bases, start, body)."""
+    """The classes defined at namespace scope: (keyword, name, bases, start, body)."""
     place = 0
     while place < len(code):
         candidates = [match for match in (NAMESPACE.search(code, place), CLASS.search(code, place)) if match]
@@ -63,7 +63,7 @@ def classes(code):
         if brace < 0:
             return
         found = next((match for match in candidates if match.end() == brace + 1), None)
-        if found is None:  # a function, an enumeration, an initializer
+        if found is None:  # a function, an enumeration or an initializer
             place = end_of_block(code, brace + 1)
         elif found.re is NAMESPACE:
             place = brace + 1
@@ -82,8 +82,8 @@ def without_template_arguments(statement):
 
 
 def is_more_than_data(body):
-    """Whether a class with this body has member functions that are not const, static, defaulted, deleted or friends."""
-    while True:  # what stands in inner braces: bodies of functions, initializers, inner types
+    """True if a class with this body has member functions other than const, static, defaulted, deleted or friends."""
+    while True:  # removes the contents of inner braces: function bodies, initializers, inner types
         flat = re.sub(r"\{[^{}]*\}", ";", body)
         if flat == body:
             break
@@ -100,7 +100,7 @@ def is_more_than_data(body):
 
 
 def comment_above(lines, line):
-    """The comment above a line (counted from 0), past the template that the line belongs to."""
+    """The comment above a line (counted from 0), skipping the template line that belongs to it."""
     line -= 1
     while line >= 0 and re.match(r"\s*(template|requires)\b", lines[line]):
         line -= 1
@@ -112,7 +112,7 @@ def comment_above(lines, line):
 
 
 def silent_classes(text):
-    """(line, name) of every class that must say its threads and does not."""
+    """(line, name) of every class that must document its threads and does not."""
     code, lines = code_of(text), text.splitlines()
     for keyword, name, bases, start, body in classes(code):
         if keyword == "struct" and not bases and not is_more_than_data(body):

@@ -1,5 +1,5 @@
 #!/usr/bin/env python3
-"""Feeds tests/tree/thread_words.py small headers, and small made-up trees."""
+"""Tests tests/tree/thread_words.py with small headers and small trees."""
 
 import pathlib
 import re

@@ -21,18 +21,18 @@ constexpr std::array kPorts{port_type::BackFacingCamera, port_type::BackFacingTe
 constexpr std::uint64_t kMaxSide = 65536;
 constexpr std::uint64_t kMinBuffers = 2;
 constexpr std::uint64_t kMaxBuffers = 32;          // VIDEO_MAX_FRAME of linux/videodev2.h
-constexpr std::size_t kMaxControlNameLength = 31;  // v4l2_query_ext_ctrl has 32 bytes for it and its end
-constexpr std::size_t kMaxDriverLength = 15;       // v4l2_capability, likewise
+constexpr std::size_t kMaxControlNameLength = 31;  // without the null; v4l2_query_ext_ctrl has 32 bytes
+constexpr std::size_t kMaxDriverLength = 15;       // without the null, in v4l2_capability
 constexpr std::size_t kMaxCardLength = 31;
 constexpr std::size_t kMaxBusInfoLength = 31;
-constexpr std::uint64_t kLastMetadataByte = 16777215;  // of a buffer
+constexpr std::uint64_t kLastMetadataByte = 16777215;  // offset in a buffer
 
 // An optional comment key. If present, it must be a string.
 void checkRemark(const JsonCursor& cursor, std::string_view key) {
   if (const auto remark = cursor.find(key)) static_cast<void>(remark->text());
 }
 
-// All entries of an object whose keys are names.
+// The members of an object whose keys are names.
 std::vector<std::pair<std::string, JsonCursor>> namedEntries(const JsonCursor& cursor) {
   std::vector<std::pair<std::string, JsonCursor>> entries = cursor.entries();
   for (const auto& [name, ignored] : entries) {
@@ -96,7 +96,7 @@ MetadataField readField(const std::string& key, const JsonCursor& cursor) {
     field.shift = static_cast<std::uint32_t>(shift->integer(0, field.bytes * 8U - 1));
   }
   if (const auto mask = cursor.find("mask")) {
-    const std::uint32_t bits = field.bytes * 8U - field.shift;  // that are left of the number
+    const std::uint32_t bits = field.bytes * 8U - field.shift;  // the bits that remain after the shift
     field.mask = mask->integer(1, std::numeric_limits<std::uint64_t>::max() >> (64U - bits));
   }
   return field;
@@ -213,7 +213,7 @@ GroupBinding readGroup(const std::string& name, const JsonCursor& cursor, const 
   return group;
 }
 
-// HID devices, their reports and what a display publishes are only known when they are used.
+// HID devices, their reports and display properties are only known at run time.
 FaultTargets targetsOf(const Binding& binding) {
   FaultTargets targets;
   for (const CameraBinding& camera : binding.cameras) targets.streams.push_back(camera.port);

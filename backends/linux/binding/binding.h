@@ -13,8 +13,8 @@
 
 namespace quazor {
 
-// Which video node: what its driver says of it (VIDIOC_QUERYCAP), never its number, which changes from boot to boot.
-// What is not given matches everything.
+// Selects a video node by what its driver reports (VIDIOC_QUERYCAP), because its number may change from boot to boot. A
+// member without a value matches everything.
 struct VideoNodeMatch {
   std::optional<std::string> driver;
   std::optional<std::string> card;
@@ -23,13 +23,13 @@ struct VideoNodeMatch {
   friend bool operator==(const VideoNodeMatch&, const VideoNodeMatch&) = default;
 };
 
-// A control of a video node, by the name that the driver gives it (VIDIOC_QUERY_EXT_CTRL), and a value for it.
+// A control of a video node, by the driver's name for it (VIDIOC_QUERY_EXT_CTRL), and a value.
 struct ControlSetting {
   std::string control;
   std::int64_t value = 0;
 };
 
-// Part of a buffer of a metadata node: an unsigned little-endian integer of `bytes` bytes, shifted down, then masked.
+// Part of a metadata buffer: an unsigned little-endian integer of `bytes` bytes, shifted right, then masked.
 struct MetadataField {
   std::string key;
   std::uint32_t offset = 0;
@@ -44,29 +44,29 @@ struct MetadataControl {
   std::string control;
 };
 
-// What a frame's metadata dictionary is made of; where two give the same key, the later of this order holds.
+// The sources of a frame's metadata dictionary. If two give the same key, the later one in this order applies.
 struct MetadataBinding {
   Dictionary constants;
-  std::optional<VideoNodeMatch> node;  // a metadata node, whose buffers are paired with frames by time stamp
-  std::vector<MetadataField> fields;   // of that node's buffers; empty without a node
+  std::optional<VideoNodeMatch> node;  // a metadata node; its buffers are matched to frames by time stamp
+  std::vector<MetadataField> fields;   // fields of those buffers; empty without a node
   std::vector<MetadataControl> controls;
 };
 
-// How the light source is driven. Everything of `off` is set before the first use, at the end of every stream, and when
-// the process ends in whatever way.
+// The controls of the light source. The settings in `off` are applied before the first use, at the end of every stream,
+// and whenever the process ends, even by a crash.
 struct ProjectorBinding {
-  std::vector<ControlSetting> on;  // in this order, when the stream starts with a light source configured
+  std::vector<ControlSetting> on;  // set in this order when a stream starts with a light source configured
   std::vector<ControlSetting> off;
-  // Controls that take the numbers of InfraredLightSourceConfiguration as they are.
+  // Controls that are set to the numbers of InfraredLightSourceConfiguration.
   std::optional<std::string> modeControl;
   std::optional<std::string> patternControl;
   std::optional<std::string> currentControl;
 };
 
-// An error counter of a stream: a file with one number, or a control of the camera. Counts from the start of the
-// stream.
+// An error counter of a stream: a file with one number, or a control of the camera. Its value is relative to the start
+// of the stream.
 struct ErrorCounterBinding {
-  std::string name;  // as "I2CErrorCount"
+  std::string name;  // for example "I2CErrorCount"
   std::optional<std::filesystem::path> file;
   std::optional<std::string> control;
 };
@@ -77,20 +77,20 @@ struct CameraBinding {
   std::uint32_t width = 0;
   std::uint32_t height = 0;
   std::uint32_t buffers = 4;
-  std::vector<ControlSetting> controls;  // set, in this order, when control of the stream is taken
+  std::vector<ControlSetting> controls;  // set in this order when a user takes control of the stream
   MetadataBinding metadata;
   std::optional<ProjectorBinding> projector;
   std::vector<ErrorCounterBinding> errorCounters;
 };
 
-// Cameras that can run in lockstep, in a fixed order.
+// Cameras that can be synchronised, in a fixed order.
 struct GroupBinding {
   std::vector<std::string> ports;
-  std::string master;  // one of them
-  std::string name{};  // by which faults select it
+  std::string master;  // one of the ports
+  std::string name{};  // the name that faults use
 };
 
-// Files whose numbers are report channels.
+// Files that contain the values of report channels.
 //
 // `path` is absolute; its components may contain the placeholders {group}, {subgroup} and {name}, each at most once,
 // which match any non-empty text, and *, which matches any text (name_pattern.h). A channel's group, subgroup and name
@@ -100,21 +100,21 @@ struct CounterFilesBinding {
   std::optional<std::string> group;
   std::optional<std::string> subgroup;
   std::optional<std::string> name;
-  // For files of lines "KEY NUMBER": which key, or "{name}" for a channel of each. Nothing: the file is one number.
+  // For files with lines "KEY NUMBER": the key, or "{name}" for one channel per key. Nothing: the file is one number.
   std::optional<std::string> key;
 };
 
-// Tracepoints that are counted (perf_event_open), also those of kprobes that were defined in tracefs.
+// Tracepoints to count (perf_event_open), including those of kprobes that are defined in tracefs.
 struct TracepointBinding {
-  std::string system;                   // such as "v4l2"; * matches any text
-  std::string event;                    // such as "v4l2_dqbuf"; * matches any text
+  std::string system;                   // for example "v4l2"; * matches any text
+  std::string event;                    // for example "v4l2_dqbuf"; * matches any text
   std::optional<std::string> group;     // default: "tracepoints"
   std::optional<std::string> subgroup;  // default: the system
   std::optional<std::string> name;      // default: the event
 };
 
 struct DisplayBinding {
-  std::string connector;  // as "Virtual-1": without the number of the card
+  std::string connector;  // for example "Virtual-1", without the number of the card
 };
 
 struct Binding {
@@ -123,13 +123,13 @@ struct Binding {
   std::vector<GroupBinding> groups;
   std::vector<CounterFilesBinding> counterFiles;
   std::vector<TracepointBinding> tracepoints;
-  std::optional<DisplayBinding> display;  // nothing: the first connector that is connected
-  // What is made to go wrong. Cameras are selected by their ports, HID devices by the names that they give themselves.
+  std::optional<DisplayBinding> display;  // nothing: the first connected connector
+  // The faults to inject. They select cameras by port and HID devices by the name that the device reports.
   std::vector<Fault> faults;
 };
 
-// Reads a binding file (data/bindings/binding.schema.json describes its form). Throws InputError: one sentence
-// with the file, the place in it and what would be right.
+// Reads a binding file (the format is described in data/bindings/binding.schema.json). Throws InputError with one
+// sentence that contains the file, the place and the expectation.
 Binding readBinding(const std::filesystem::path& file);
 
 }  // namespace quazor

@@ -17,7 +17,7 @@ namespace quazor {
 namespace {
 
 constexpr std::string_view kNameAsKey = "{name}";
-constexpr std::size_t kMaxPathLength = 4095;  // PATH_MAX of linux/limits.h without its end
+constexpr std::size_t kMaxPathLength = 4095;  // PATH_MAX of linux/limits.h without the null
 
 struct Part {
   std::string_view key;
@@ -57,7 +57,7 @@ std::optional<std::string> findText(const JsonCursor& cursor, std::string_view k
   return found ? std::optional(found->text()) : std::nullopt;
 }
 
-// A channel's group, subgroup or name, as the binding gives it.
+// The group, subgroup or name of a channel, if the binding contains it.
 std::optional<std::string> findPart(const JsonCursor& cursor, std::string_view key) {
   std::optional<std::string> text = findText(cursor, key);
   for (const Part& part : kParts) {
@@ -118,7 +118,7 @@ TracepointBinding readTracepoints(const JsonCursor& cursor) {
   return tracepoints;
 }
 
-// Everything that an entry says.
+// All members, for comparison.
 auto allOf(const CounterFilesBinding& one) { return std::tie(one.path, one.key, one.group, one.subgroup, one.name); }
 auto allOf(const TracepointBinding& one) { return std::tie(one.system, one.event, one.group, one.subgroup, one.name); }
 

@@ -1,4 +1,4 @@
-// What a binding file says of counters.
+// Reads the counters of a binding file.
 #pragma once
 
 #include "backends/linux/binding/binding.h"
@@ -9,10 +9,10 @@
 
 namespace quazor {
 
-// All throw InputError: "PATH: ...".
+// All of these throw InputError: "PATH: ...".
 std::vector<CounterFilesBinding> readAllCounterFiles(const JsonCursor& cursor);
 std::vector<TracepointBinding> readAllTracepoints(const JsonCursor& cursor);
-// An absolute path that a system call can take, without components that lead back.
+// An absolute path of valid length, without "..".
 std::string readPathText(const JsonCursor& cursor);
 
 }  // namespace quazor

@@ -34,7 +34,7 @@ class BindingTest : public ::testing::Test {
     std::ofstream(file_, std::ios::binary) << text;
     return readBinding(file_);
   }
-  // What is wrong, with "F" for the file; "nothing" when it was read.
+  // The error message, with "F" for the file; "nothing" if the text is valid.
   std::string problemOf(std::string_view text) {
     std::string problem;
     try {
@@ -50,9 +50,9 @@ class BindingTest : public ::testing::Test {
   const fs::path file_;
 };
 
-// A binding with one more entry in its second line.
+// A binding with an additional entry on its second line.
 std::string with(const std::string& entry) { return "{\"title\": \"t\",\n" + entry + "}"; }
-// One with a camera, which has one more entry in its third line.
+// A binding with a camera that has an additional entry on its third line.
 std::string withCamera(const std::string& entry) {
   return with(R"("cameras": {"BackFacingCamera": {"node": {"card": "c"}, "size": {"width": 4, "height": 2},)"
               "\n" +
@@ -67,7 +67,7 @@ std::string withGroup(const std::string& entries) {
   return withCamera("\"buffers\": 4}}, \"groups\": {\"g\": {" + entries);
 }
 std::string withFiles(const std::string& entries) { return with("\"counterFiles\": [{" + entries + "}]"); }
-// The channels' group and subgroup are given, so that their name is left.
+// An entry for this path. The group and subgroup are fixed, so only the name is missing.
 std::string withPath(const std::string& path, const std::string& entries = "\"name\": \"n\"") {
   return withFiles("\"path\": \"" + path + "\", \"group\": \"g\", \"subgroup\": \"s\", " + entries);
 }

@@ -15,18 +15,18 @@ constexpr std::string_view kState = "it is a current state";
 
 struct Rule {
   std::string_view file;
-  std::string_view key;     // "*": of any key, and of a file that is one number
-  std::string_view reason;  // empty: it is a counter after all
+  std::string_view key;     // "*" matches any key, and a file with one number
+  std::string_view reason;  // empty: it is a counter
 };
 
-// The first rule that fits holds.
+// The first matching rule applies.
 constexpr Rule kRules[] = {
-    // Some of these count events, but nothing in their names says which.
+    // Some of these count events, but their names do not show which.
     {"/proc/vmstat", "nr_*", kStock},
     {"/proc/vmstat", "workingset_nodes", kStock},
     {"/proc/meminfo", "*", kStock},
     {"/proc/loadavg", "*", kStock},
-    {"/sys/fs/cgroup*/memory.stat", "pg*", {}},  // of a group, or of the root itself
+    {"/sys/fs/cgroup*/memory.stat", "pg*", {}},  // of a control group or of the root
     {"/sys/fs/cgroup*/memory.stat", "workingset_*", {}},
     {"/sys/fs/cgroup*/memory.stat", "thp_*", {}},
     {"/sys/fs/cgroup*/memory.stat", "zswp*", {}},
@@ -39,7 +39,7 @@ constexpr Rule kRules[] = {
     {"/sys/fs/cgroup/*.low", "*", kSetting},
     {"/sys/fs/cgroup/*.high", "*", kSetting},
     {"/sys/fs/cgroup/*.weight", "*", kSetting},
-    {"/sys/fs/cgroup/*", "*", {}},  // whatever the groups are called
+    {"/sys/fs/cgroup/*", "*", {}},  // for any name of a control group
     {"/sys/*hwmon*/energy*_input", "*", {}},
     {"/sys/*hwmon*_input", "*", kReading},
     {"/sys/*iio:device*/in_count*_raw", "*", {}},
@@ -56,7 +56,7 @@ constexpr Rule kRules[] = {
     {"/sys/*/net/*/statistics/*", "*", {}},
     {"/sys/*/net/*/carrier_*", "*", {}},
     {"/sys/*/net/*/queues/*/tx_timeout", "*", {}},
-    {"/sys/*/net/*/device/*", "*", {}},  // what its driver tells of the hardware
+    {"/sys/*/net/*/device/*", "*", {}},  // statistics of the driver
     {"/sys/*/net/*", "*", kSetting},
 };
 

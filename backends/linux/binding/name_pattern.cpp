@@ -73,7 +73,7 @@ bool NamePattern::match(std::string_view name, ChannelNames* names) const {
     const bool isLast = i + 1 == wildcards_.size();
     std::size_t end = isLast ? name.size() - std::min(name.size(), wildcard.after.size())
                              : name.find(wildcard.after, std::min(least, name.size()));
-    // The first place where it fits is as good as any later one: what follows has the more room.
+    // The first match is never worse than a later one, because it leaves more text for the rest.
     if (end == std::string_view::npos || end < least || (isLast && !name.ends_with(wildcard.after))) return false;
     if (const Placeholder* const placeholder = placeholderNamed(wildcard.placeholder)) {
       found.*(placeholder->member) = std::string(name.substr(at, end - at));

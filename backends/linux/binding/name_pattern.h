@@ -9,7 +9,7 @@
 
 namespace quazor {
 
-// What the placeholders of patterns stood for; nothing where there was no such placeholder.
+// The texts that the placeholders matched; nothing for a placeholder that is not in the pattern.
 struct ChannelNames {
   std::optional<std::string> group;
   std::optional<std::string> subgroup;
@@ -22,22 +22,21 @@ struct ChannelNames {
 // Thread: any; it is immutable.
 class NamePattern {
  public:
-  // Throws InputError when the text is not a pattern; what() is the end of a sentence: "contains the unknown
-  // placeholder
-  // \"{nmae}\"; ...".
+  // Throws InputError if the text is not a pattern. what() is the end of a sentence: contains the unknown placeholder
+  // "{nmae}"; ...
   static NamePattern parse(std::string_view text);
 
   // True if the pattern has no wildcards or placeholders.
   bool isLiteral() const { return wildcards_.empty(); }
   bool hasPlaceholder(std::string_view name) const;
   bool matches(std::string_view name) const { return match(name, nullptr); }
-  // On success `names`, where given, gets what the placeholders stood for.
+  // On success stores the texts that the placeholders matched in `names`, unless it is null.
   bool match(std::string_view name, ChannelNames* names) const;
 
  private:
   // A wildcard or placeholder, and the literal text after it.
   struct Wildcard {
-    std::string placeholder;  // without its braces; empty for a *
+    std::string placeholder;  // without braces; empty for *
     std::string after;
   };
 

@@ -10,7 +10,7 @@
 namespace quazor {
 namespace {
 
-// "group|subgroup|name" of what the placeholders stood for, "-" for none; "no" when the name does not match.
+// "GROUP|SUBGROUP|NAME" as matched by the placeholders, "-" for none; "no" if the name does not match.
 std::string matched(std::string_view pattern, std::string_view name) {
   const NamePattern parsed = NamePattern::parse(pattern);
   ChannelNames names;

@@ -28,7 +28,7 @@ bool CameraBuffers::prepare(std::uint32_t count, DiagnosticErrorPtr* error) {
   if (!node_->call(VIDIOC_REQBUFS, "VIDIOC_REQBUFS", &request, error)) return false;
   requested_ = true;
   if (request.count == 0) {
-    failLinux(error, LinuxErrorCode::kSystemCall, "VIDIOC_REQBUFS on " + node_->path() + " gave no buffers.");
+    failLinux(error, LinuxErrorCode::kSystemCall, "VIDIOC_REQBUFS on " + node_->path() + " provided no buffers.");
     return false;
   }
   for (std::uint32_t index = 0; index < request.count; ++index) {
@@ -94,7 +94,7 @@ int CameraBuffers::dequeue(DequeuedBuffer& buffer) {
   buffer.bytesUsed = taken.bytesused;
   buffer.sequence = taken.sequence;
   buffer.isBad = (taken.flags & V4L2_BUF_FLAG_ERROR) != 0;
-  // A driver that stamps by no clock that we know leaves us the moment at which we saw the buffer.
+  // If the driver does not use the monotonic clock, the time of dequeuing is the best approximation.
   const bool isMonotonic = (taken.flags & V4L2_BUF_FLAG_TIMESTAMP_MASK) == V4L2_BUF_FLAG_TIMESTAMP_MONOTONIC;
   buffer.timestamp = isMonotonic ? timeOf(taken.timestamp) : node_->kernel().now();
   return 0;

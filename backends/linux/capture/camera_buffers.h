@@ -1,4 +1,4 @@
-// CameraBuffers: the mapped buffers of one video or metadata node, from the request for them to their release.
+// CameraBuffers: the mapped buffers of one video or metadata node.
 #pragma once
 
 #include "backends/linux/video/v4l2_device.h"
@@ -37,19 +37,18 @@ class CameraBuffers final {
   // Requests, maps and queues buffers; the driver may give more or fewer than `count`.
   bool prepare(std::uint32_t count, DiagnosticErrorPtr* error);
   bool streamOn(DiagnosticErrorPtr* error);
-  // Ends the stream, unmaps the buffers and gives them back. False, with the first error, when the driver refused
-  // any of that; nothing is ours afterwards even so, as far as the system can tell. Does nothing a second time.
+  // Stops the stream, unmaps the buffers and releases them. If the driver refuses a step, performs the remaining ones
+  // and returns false with the first error. Does nothing in a second call.
   bool release(DiagnosticErrorPtr* error);
 
-  // Takes a filled buffer. 0, or the error number: EAGAIN when there is none at the moment.
+  // Dequeues a filled buffer. Returns 0 or an error number: EAGAIN if none is ready.
   int dequeue(DequeuedBuffer& buffer);
-  // What is in it, until it is queued again.
+  // The content of the buffer, valid until it is queued again.
   std::span<const std::uint8_t> contents(const DequeuedBuffer& buffer) const;
-  // Gives the buffer to the driver again, and with it those that the driver would not take before. 0, or the error
-  // number, for this buffer.
+  // Queues the buffer, and those that the driver refused earlier. Returns 0 or the error number for this buffer.
   int queue(std::uint32_t index);
 
-  // How many there are.
+  // The number of buffers.
   std::size_t count() const { return mapped_.size(); }
 
  private:
@@ -63,8 +62,8 @@ class CameraBuffers final {
 
   const std::shared_ptr<V4l2Device> node_;
   const std::uint32_t type_;
-  std::vector<Mapped> mapped_;          // by the buffer's index
-  std::vector<std::uint32_t> refused_;  // by the driver, which did not take them back
+  std::vector<Mapped> mapped_;          // by buffer index
+  std::vector<std::uint32_t> refused_;  // indexes of buffers that the driver refused to queue
   bool requested_ = false;
   bool streaming_ = false;
 };

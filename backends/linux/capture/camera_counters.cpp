@@ -14,7 +14,7 @@
 namespace quazor {
 namespace {
 
-// What the diagnostics of the infrared camera read.
+// Read by the diagnostics of the infrared camera.
 constexpr std::array<std::string_view, 6> kDefaultCounters{
     capture_key::I2CErrorCount, capture_key::MIPIErrorCount, "LPDPErrorCount", "UARTErrorCount", "SIFErrorCount",
     "ProjectorErrorCount"};

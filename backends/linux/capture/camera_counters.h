@@ -1,4 +1,4 @@
-// What a stream counts.
+// The counters of a stream.
 #pragma once
 
 #include "backends/linux/binding/binding.h"
@@ -14,21 +14,21 @@
 
 namespace quazor {
 
-// In ErrorCounters, beside those that the binding names.
+// Keys of ErrorCounters in addition to those of the binding.
 namespace kernel_counter {
 // Frames that the driver counted and did not deliver.
 inline constexpr std::string_view kSequenceGaps = "SequenceGapCount";
-// Buffers that the driver marked as damaged. They are no frames: they are not counted and not handed to handlers.
+// Buffers that the driver marked as damaged. They are neither counted as frames nor passed to handlers.
 inline constexpr std::string_view kBadBuffers = "BufferErrorCount";
 // Calls that the driver refused while the stream ran.
 inline constexpr std::string_view kStreamErrors = "StreamErrorCount";
-// The device was removed while the stream ran.
+// Removals of the device while the stream ran.
 inline constexpr std::string_view kDisconnects = "DisconnectCount";
-// Frames whose metadata was not complete.
+// Frames with incomplete metadata.
 inline constexpr std::string_view kMissingMetadata = "MetadataErrorCount";
 }  // namespace kernel_counter
 
-// What has come of a stream since it began.
+// The counts of a stream since its start.
 // Thread: one at a time; any number may read while none writes.
 struct FrameCounts {
   std::uint64_t frames = 0;
@@ -40,25 +40,25 @@ struct FrameCounts {
   std::uint64_t disconnects = 0;
   std::uint64_t missingMetadata = 0;
 
-  // Counts a buffer: its sequence number and, unless it is damaged, its frame. Numbers wrap around at 2^32; one that
-  // is the last one again, or lower, tells of no gap.
+  // Counts a buffer: its sequence number and, unless it is damaged, its frame. Sequence numbers wrap around at 2^32. A
+  // number that is not higher than the last one is not a gap.
   void count(std::uint32_t sequence, std::chrono::nanoseconds timestamp, bool isBad);
 };
 
-// By how many frames of `interval` a camera's first frame came after the master's: rounded to the nearest, negative
-// when it came before. 0 while either has none.
+// The number of frames of `interval` by which a camera's first frame came after the master's, rounded to the nearest;
+// negative if it came before. 0 if either has no frame.
 std::int64_t frameOffset(const FrameCounts& camera, const FrameCounts& master, FrameInterval interval);
 
-// The counters that a binding names: files and controls, whose numbers count from an unknown moment.
+// The counters of a binding, which are files and controls. Their values do not start at 0.
 // Thread: one at a time.
 class BoundCounters final {
  public:
-  // What they are at the start of a stream; from there on they count. Nothing, and an error, when one cannot be read.
+  // Reads the initial values, which are subtracted later. Returns nothing and an error if one cannot be read.
   static std::optional<BoundCounters> begin(const std::vector<ErrorCounterBinding>& counters, const V4l2Device& node,
                                             DiagnosticErrorPtr* error);
 
-  // By how much they have grown; one that is below what it was has begun anew, from 0. False, and an error, when one
-  // cannot be read.
+  // Adds the increments to the dictionary. A value below its initial value was reset and counts from 0. Returns false
+  // and an error if one cannot be read.
   bool addTo(Dictionary& dictionary, const V4l2Device& node, DiagnosticErrorPtr* error) const;
 
  private:
@@ -70,8 +70,8 @@ class BoundCounters final {
   std::vector<Counter> counters_;
 };
 
-// ErrorCounters of a stream that has counted nothing: the counters that diagnostics read are 0 where the binding names
-// none, then the binding's, then those of the kernel.
+// The ErrorCounters of a stream without counts: 0 for each counter that diagnostics read and the binding lacks, then
+// the counters of the binding, then those of the kernel.
 Dictionary errorCountersOf(const std::vector<ErrorCounterBinding>& bound);
 void addKernelCounters(Dictionary& dictionary, const FrameCounts& counts);
 

@@ -29,7 +29,7 @@ CameraInfo infoOf(const CameraBinding& binding) {
   return info;
 }
 
-// Below it no interval can be told to a driver.
+// A lower rate cannot be expressed as an interval.
 constexpr double kMinRate = 0.01;
 
 }  // namespace
@@ -80,15 +80,15 @@ bool LinuxCamera::applyFormat(const CameraSettings& wanted, DiagnosticErrorPtr* 
 bool LinuxCamera::applyRates(const CameraSettings& wanted, DiagnosticErrorPtr* error) {
   for (const std::optional<Value>& rate : {wanted.minimumRate, wanted.maximumRate}) {
     if (!rate || toDouble(&*rate) >= kMinRate) continue;
-    return refuseLinux(error, LinuxErrorCode::kBadValue, "%@: no driver takes less than %@ frames per second.", port(),
-                       kMinRate);
+    return refuseLinux(error, LinuxErrorCode::kBadValue, "%@: no driver supports less than %@ frames per second.",
+                       port(), kMinRate);
   }
   const bool agree =
       wanted.minimumRate && wanted.maximumRate && toDouble(&*wanted.minimumRate) <= toDouble(&*wanted.maximumRate);
   return !agree || intervalOf(wanted, error);
 }
 
-// Sets what the rates ask for. Without any rate, the driver keeps its own, which it may be unable to tell.
+// Sets the requested rates. Without a rate the driver's own interval remains, which may be unknown.
 std::optional<FrameInterval> LinuxCamera::intervalOf(const CameraSettings& settings, DiagnosticErrorPtr* error) {
   const auto& [minimum, maximum] = std::tie(settings.minimumRate, settings.maximumRate);
   if (!minimum && !maximum) return node_->interval(nullptr).value_or(FrameInterval());
@@ -100,10 +100,11 @@ std::optional<FrameInterval> LinuxCamera::intervalOf(const CameraSettings& setti
   const double rate = given->numerator == 0 ? 0 : given->framesPerSecond();
   const bool fits = rate > 0 && rate >= lowest * (1 - kRateTolerance) && rate <= highest * (1 + kRateTolerance);
   if (fits) return given;
-  refuseLinux(error, LinuxErrorCode::kNotSupported,
-              "%@: %@ does not take %@ between frames in this format; its driver gives %@ instead, which is %@ frames "
-              "per second.",
-              port(), node_->path(), textOf(wanted), textOf(*given), rate);
+  refuseLinux(
+      error, LinuxErrorCode::kNotSupported,
+      "%@: %@ does not support %@ between frames in this format; its driver uses %@ instead, which is %@ frames "
+      "per second.",
+      port(), node_->path(), textOf(wanted), textOf(*given), rate);
   return std::nullopt;
 }
 
@@ -115,10 +116,10 @@ bool LinuxCamera::applyAutoExposure(const CameraSettings& wanted, DiagnosticErro
                        node_->path());
   }
   if (control != nullptr) {
-    // Of the automatic ways, cameras have this or that; the driver's default is one that it has.
+    // Cameras support different automatic modes. The driver's default is one that this camera supports.
     constexpr std::int64_t kManual = V4L2_EXPOSURE_MANUAL;
     constexpr std::int64_t kAutomatic = V4L2_EXPOSURE_AUTO;
-    const std::int64_t automatic = control->usual == kManual ? kAutomatic : control->usual;
+    const std::int64_t automatic = control->defaultValue == kManual ? kAutomatic : control->defaultValue;
     return node_->set(*control, isAutomatic ? automatic : kManual, error);
   }
   return true;
@@ -129,14 +130,14 @@ bool LinuxCamera::checkLightSource(const CameraSettings& wanted, DiagnosticError
     const VideoControl* const control = node_->control(setting.control, error);
     if (control == nullptr) return false;
     if (!takes(*control, setting.value)) {
-      return refuseLinux(error, LinuxErrorCode::kBadValue, "%@: the control \"%@\" takes %@ to %@, not %@.", port(),
-                         control->name, control->lowest, control->highest, setting.value);
+      return refuseLinux(error, LinuxErrorCode::kBadValue, "%@: the control \"%@\" accepts %@ to %@, not %@.", port(),
+                         control->name, control->minimum, control->maximum, setting.value);
     }
   }
   return true;
 }
 
-// What lights the projector; nothing in mode 0, which keeps it dark. What is switched on comes last.
+// The controls that switch the projector on, in order; empty for mode 0, in which it stays dark.
 std::vector<ControlSetting> LinuxCamera::lightOf(const Value& configuration) const {
   std::vector<ControlSetting> settings;
   if (!binding_.projector || !toBoolean(entryOf(&configuration, capture_key::Mode))) return settings;

@@ -1,4 +1,4 @@
-// LinuxCamera: one camera of the binding, with the video node that is its own while somebody has control of it.
+// LinuxCamera: one camera of the binding. It has its video node open while a user has control of it.
 #pragma once
 
 #include "backends/capture/capture_back.h"
@@ -14,9 +14,9 @@
 
 namespace quazor {
 
-// What the cameras of a machine share.
+// State shared by the cameras of a machine.
 //
-// Thread: one at a time; what is const, any.
+// Thread: one at a time; any for the const members.
 struct LinuxCameras {
   LinuxCameras(std::shared_ptr<V4l2Api> system, DeviceRoots deviceRoots)
       : kernel(std::move(system)), roots(std::move(deviceRoots)) {}
@@ -24,13 +24,13 @@ struct LinuxCameras {
   const std::shared_ptr<V4l2Api> kernel;
   const DeviceRoots roots;
   const std::shared_ptr<DeliveredFrames> delivered = std::make_shared<DeliveredFrames>(0);
-  std::vector<V4l2DeviceInfo> nodes;  // as they were before cameras were opened
+  std::vector<V4l2DeviceInfo> nodes;  // as found before the cameras were opened
 };
 
-// How far the driver's frame rate may be from the one that was asked for, as a share of it: 29.97 counts as 30.
+// The tolerance of a frame rate, relative to the requested one: 29.97 is accepted for 30.
 inline constexpr double kRateTolerance = 0.002;
 
-// The shortest fraction for a rate: of seconds, from frame to frame.
+// The shortest exact fraction for a rate: seconds per frame.
 FrameInterval intervalFor(double framesPerSecond);
 
 // Thread: one at a time.
@@ -39,23 +39,23 @@ class LinuxCamera final : public CameraBack {
   LinuxCamera(CameraBinding binding, std::shared_ptr<LinuxCameras> cameras);
 
   const CameraInfo& info() const override { return info_; }
-  // Finds and opens the camera's nodes among those that there are, puts its projector out and sets the binding's
-  // controls. Automatic exposure is as the driver has it.
+  // Finds and opens the nodes of the camera, switches its projector off and sets the controls of the binding. Automatic
+  // exposure keeps the driver's setting.
   bool open(CameraSettings& settings, DiagnosticErrorPtr* error) override;
   void close() override;
   std::optional<std::uint64_t> maxFormatIndex() const override { return std::nullopt; }
   std::optional<double> maxFrameRate(const CameraSettings&) const override { return std::nullopt; }
   bool applyFormat(const CameraSettings& wanted, DiagnosticErrorPtr* error) override;
-  // The driver is asked as soon as both rates are known and do not contradict each other.
+  // Sets the rate in the driver as soon as both rates are known and do not contradict each other.
   bool applyRates(const CameraSettings& wanted, DiagnosticErrorPtr* error) override;
-  // Sets the control of that purpose where the camera has one. Without one, its exposure never changes by itself.
+  // Sets the exposure control if the camera has one. A camera without one never adjusts its exposure.
   bool applyAutoExposure(const CameraSettings& wanted, DiagnosticErrorPtr* error) override;
   bool checkLightSource(const CameraSettings& wanted, DiagnosticErrorPtr* error) override;
   std::optional<Dictionary> errorCounters(const CaptureRun* run, DiagnosticErrorPtr* error) const override;
   std::optional<SessionCount> sessionCount(const CaptureRun* run, const CaptureRun& master) const override;
 
-  // Format and rate are set once more: somebody else may have set others since, and a format may have changed the
-  // rate. The stretch, which has begun; null, and an error, on failure. REQUIRES: open.
+  // Starts streaming; returns null and an error on failure. Sets format and rate again, because another process may
+  // have changed them, or the format may have changed the rate. REQUIRES: open.
   std::shared_ptr<CameraRun> begin(const CameraSettings& settings, DiagnosticErrorPtr* error);
 
  private:

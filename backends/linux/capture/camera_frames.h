@@ -1,4 +1,4 @@
-// The pixel buffers that handlers get.
+// The pixel buffers that handlers receive.
 #pragma once
 
 #include "contract/value.h"
@@ -15,10 +15,10 @@
 
 namespace quazor {
 
-// Hands out buffers and takes them back with their last reference.
+// Provides buffers and reclaims them when the last reference is released.
 //
-// A frame's pixels are not exposed, so what the driver filled goes back to it before the handler is called, and a
-// buffer here holds the frame's metadata alone: one that is kept, or never given back, takes nothing from the driver.
+// The pixels of a frame are not exposed, so the driver gets its buffer back before the handler is called, and a pixel
+// buffer contains only the frame's metadata. A plug-in that keeps a pixel buffer does not take one from the driver.
 //
 // Thread: any.
 class FramePool final {
@@ -27,12 +27,12 @@ class FramePool final {
   FramePool(const FramePool&) = delete;
   FramePool& operator=(const FramePool&) = delete;
 
-  // The process' own. It is never destroyed, as plug-ins may give buffers back at any time, or never.
+  // The pool of the process. It is never destroyed, because plug-ins may release buffers at any time, or never.
   static FramePool& shared();
 
-  // A buffer with one reference, the caller's. `metadata` is its attachment MetadataDictionary.
+  // A buffer with one reference, owned by the caller. `metadata` becomes its attachment MetadataDictionary.
   PixelBuffer& take(Value metadata);
-  // How many buffers are out.
+  // The number of buffers in use.
   std::size_t held() const;
 
  private:
@@ -52,7 +52,7 @@ class FramePool final {
     std::optional<Value> metadata_;
   };
 
-  mutable std::mutex mutex_;  // guards what follows
+  mutable std::mutex mutex_;  // guards the members below
   std::deque<Buffer> buffers_;
   std::vector<Buffer*> free_;
 };

@@ -1,4 +1,4 @@
-// CameraMetadata: makes the metadata dictionary of a frame.
+// CameraMetadata: builds the metadata dictionary of a frame.
 #pragma once
 
 #include "backends/linux/binding/binding.h"
@@ -14,21 +14,21 @@
 
 namespace quazor {
 
-// The field's number; nothing when the buffer ends before it.
+// The value of the field; nothing if the buffer is too short.
 std::optional<std::uint64_t> fieldIn(std::span<const std::uint8_t> buffer, const MetadataField& field);
 
 // Thread: one at a time.
 class CameraMetadata final {
  public:
-  // Null, and an error, when the binding names a control that the camera does not have.
+  // Returns null and an error if the binding names a control that the camera does not have.
   static std::unique_ptr<CameraMetadata> make(const MetadataBinding& binding, const V4l2Device& camera,
                                               DiagnosticErrorPtr* error);
 
-  // The controls that are read with every frame; one that cannot be read is missing.
+  // The controls that are read with every frame; omits those that cannot be read.
   Dictionary readControls(const V4l2Device& camera) const;
 
-  // The frame's dictionary: constants, then fields, then controls. What ought to have come from a metadata buffer or a
-  // control and did not is left out, even where a constant has the same key; then `complete` is false.
+  // The frame's dictionary: constants, then fields, then controls. Omits the key of a missing field or control, even if
+  // a constant has the same key, and then sets `complete` to false.
   Dictionary dictionaryOf(const CapturedFrame& frame, bool* complete) const;
 
  private:

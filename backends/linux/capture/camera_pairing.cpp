@@ -10,7 +10,7 @@ void FramePairing::addFrame(CapturedFrame frame, std::chrono::nanoseconds now) {
 
 void FramePairing::addMetadata(std::chrono::nanoseconds timestamp, std::vector<std::uint8_t> contents) {
   metadata_.push_back({timestamp, std::move(contents)});
-  if (metadata_.size() > kMaxMetadata) metadata_.pop_front();  // of a node whose camera delivers nothing
+  if (metadata_.size() > kMaxMetadata) metadata_.pop_front();  // the camera may have stopped delivering frames
 }
 
 std::optional<CapturedFrame> FramePairing::next(std::chrono::nanoseconds now) {

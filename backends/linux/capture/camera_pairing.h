@@ -1,4 +1,4 @@
-// FramePairing: finds for each frame the metadata buffer that belongs to it.
+// FramePairing: matches frames with their metadata buffers.
 #pragma once
 
 #include "contract/value.h"
@@ -11,33 +11,33 @@
 
 namespace quazor {
 
-// A frame on its way to the handlers.
+// A frame on its way to a handler.
 struct CapturedFrame {
   std::chrono::nanoseconds timestamp{0};
-  Dictionary controls;                              // what was read with it
-  std::optional<std::vector<std::uint8_t>> paired;  // the metadata buffer with its time stamp, when it came
+  Dictionary controls;                              // control values read with the frame
+  std::optional<std::vector<std::uint8_t>> paired;  // the metadata buffer with the same time stamp, if any
 };
 
-// Frames and metadata come in the order of their time stamps, on two nodes that do not wait for each other. Sequence
-// numbers do not tell which belong together: each node counts for itself, and one may start where an earlier stream
-// ended. Time stamps do, as drivers stamp both from one reading of the clock.
+// Frames and metadata arrive in the order of their time stamps, on two independent nodes. Sequence numbers cannot match
+// them, because each node has its own, and one may continue after an earlier stream. Time stamps can, because drivers
+// stamp both from one reading of the clock.
 //
 // Thread: one at a time.
 class FramePairing final {
  public:
-  // Stamps that differ by at most this are the same moment: V4L2 gives them in microseconds.
+  // Time stamps that differ by at most this are equal: V4L2 rounds them to microseconds.
   static constexpr std::chrono::nanoseconds kTolerance = std::chrono::microseconds(2);
-  // How long a frame waits for its metadata.
+  // The maximum time that a frame waits for its metadata.
   static constexpr std::chrono::nanoseconds kMaxWait = std::chrono::milliseconds(100);
 
   void addFrame(CapturedFrame frame, std::chrono::nanoseconds now);
   void addMetadata(std::chrono::nanoseconds timestamp, std::vector<std::uint8_t> contents);
-  // No metadata will come any more: frames no longer wait.
+  // Ends the metadata: frames no longer wait for it.
   void endMetadata() { ended_ = true; }
 
-  // The next frame to hand on, in order: it has its metadata, or that will not come. Nothing when none is ready.
+  // The next frame in order that has its metadata or no longer waits for it; nothing if none is ready.
   std::optional<CapturedFrame> next(std::chrono::nanoseconds now);
-  // When next() is to be asked again though nothing was added; nothing when no frame waits.
+  // When to call next() again even if nothing was added; nothing if no frame waits.
   std::optional<std::chrono::nanoseconds> deadline() const;
 
  private:

@@ -15,7 +15,8 @@ CapturedFrame frameAt(std::chrono::nanoseconds timestamp) {
   return frame;
 }
 
-// The time stamp of the next frame and the first byte of its metadata; 0 for none, -1 each when no frame is ready.
+// The time stamp of the next frame and the first byte of its metadata: 0 without metadata, -1 and -1 if no frame is
+// ready.
 std::pair<std::int64_t, int> next(FramePairing& pairing, std::chrono::nanoseconds now = 0ms) {
   const std::optional<CapturedFrame> frame = pairing.next(now);
   if (!frame) return {-1, -1};

@@ -14,7 +14,7 @@
 
 namespace quazor {
 
-// Shared with the thread, which may outlive the poller by the end of the call in which it destroyed it.
+// Shared with the thread, which outlives the poller if it runs the poller's destructor.
 struct CameraPoller::State {
   explicit State(std::shared_ptr<V4l2Api> videoKernel) : kernel(std::move(videoKernel)) {}
   State(const State&) = delete;
@@ -34,14 +34,14 @@ struct CameraPoller::State {
   }
 
   const std::shared_ptr<V4l2Api> kernel;
-  int event = -1;  // wakes the thread; written before the thread begins
+  int event = -1;  // wakes the thread; set before the thread starts
 
-  std::mutex mutex;  // guards what follows
+  std::mutex mutex;  // guards the members below
   std::condition_variable changed;
   Streams streams;
   bool ended = false;
   bool waiting = false;     // the thread is in poll()
-  std::uint64_t waits = 0;  // that have ended
+  std::uint64_t waits = 0;  // the number of completed waits
   const PolledStream* served = nullptr;
 };
 
@@ -144,7 +144,7 @@ void CameraPoller::remove(const PolledStream& stream) {
   std::unique_lock lock(state_->mutex);
   std::erase_if(state_->streams, [&stream](const auto& one) { return one.get() == &stream; });
   if (thread_.get_id() == std::this_thread::get_id() || !thread_.joinable()) return;
-  // While poll() runs it keeps the descriptors' devices in use. A wait that begins later no longer has them.
+  // poll() keeps the devices of its descriptors in use. Later calls of poll() no longer include them.
   if (state_->waiting) {
     state_->kernel->signalEvent(state_->event);
     state_->changed.wait(lock, [this, waits = state_->waits] { return state_->waits != waits; });

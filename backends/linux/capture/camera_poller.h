@@ -1,4 +1,4 @@
-// CameraPoller: the one thread of a capture device that waits for its streams' descriptors.
+// CameraPoller: the thread of a capture device that waits for the descriptors of its streams.
 #pragma once
 
 #include "backends/linux/video/v4l2_api.h"
@@ -13,7 +13,7 @@
 
 namespace quazor {
 
-// What is served by the thread. Its calls come one at a time, and only while it is added.
+// A stream served by the thread. Calls do not overlap and are made only while the stream is added.
 // Thread: the poller's.
 class PolledStream {
  public:
@@ -22,28 +22,28 @@ class PolledStream {
   PolledStream& operator=(const PolledStream&) = delete;
   virtual ~PolledStream() = default;
 
-  // Adds what to wait for.
+  // Appends the descriptors to wait for.
   virtual void watch(std::vector<pollfd>& descriptors) const = 0;
-  // When it wants to be served though nothing happened; nothing: never.
+  // When to call serve() even without an event; nothing: never.
   virtual std::optional<std::chrono::nanoseconds> deadline() const = 0;
-  // Serves what happened; `polled` is what watch() added, with the results. May remove itself and others. False when
-  // there is no more to wait for: the stream is removed then.
+  // Handles events; `polled` contains the descriptors of watch() with their results. May remove this and other streams.
+  // Returns false if there is nothing left to wait for: the stream is then removed.
   virtual bool serve(std::span<const pollfd> polled) = 0;
 };
 
-// The thread begins with the first stream and ends with the poller.
+// The thread starts with the first stream and ends with the poller.
 // Thread: any.
 class CameraPoller final {
  public:
   explicit CameraPoller(std::shared_ptr<V4l2Api> kernel);
   CameraPoller(const CameraPoller&) = delete;
   CameraPoller& operator=(const CameraPoller&) = delete;
-  // May be called on the thread itself, by what it serves.
+  // May run on the poller's own thread.
   ~CameraPoller();
 
   bool add(std::shared_ptr<PolledStream> stream, DiagnosticErrorPtr* error);
-  // When it returns, the stream is not served any more and its descriptors are not waited for, so they can be closed.
-  // What serves on this very thread is not waited for.
+  // After the return the stream is no longer served and its descriptors can be closed. Does not wait for a serve() on
+  // the calling thread.
   void remove(const PolledStream& stream);
 
  private:

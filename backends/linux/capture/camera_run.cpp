@@ -34,12 +34,12 @@ CameraRun::CameraRun(CameraRunPlan plan, std::shared_ptr<DeliveredFrames> delive
 CameraRun::~CameraRun() { end(nullptr); }
 
 bool CameraRun::begin(DiagnosticErrorPtr* error) {
-  const bool begun = light(error) && prepare(error);
+  const bool begun = enableProjector(error) && prepare(error);
   if (!begun) end(nullptr);
   return begun;
 }
 
-bool CameraRun::light(DiagnosticErrorPtr* error) {
+bool CameraRun::enableProjector(DiagnosticErrorPtr* error) {
   if (light_.empty()) return true;
   std::vector<ControlValue> off;
   for (const ControlSetting& setting : camera_.projector->off) {
@@ -56,8 +56,8 @@ bool CameraRun::light(DiagnosticErrorPtr* error) {
   return node_->set(light_, error);
 }
 
-// The guard, as it ends, puts the light out once more.
-bool CameraRun::darken(DiagnosticErrorPtr* error) {
+// Destroying the guard also switches the projector off.
+bool CameraRun::disableProjector(DiagnosticErrorPtr* error) {
   if (guard_ == nullptr) return true;
   const bool dark = node_->set(camera_.projector->off, error);
   guard_.reset();
@@ -88,7 +88,7 @@ bool CameraRun::end(DiagnosticErrorPtr* error) {
   bool succeeded = true;
   const auto note = [&](bool done) { succeeded = succeeded && done; };
   const auto firstError = [&] { return succeeded ? error : nullptr; };
-  note(darken(firstError()));
+  note(disableProjector(firstError()));
   if (video_ != nullptr) note(video_->release(firstError()));
   if (metadata_ != nullptr) note(metadata_->release(firstError()));
   const std::lock_guard lock(mutex_);
@@ -135,7 +135,7 @@ bool CameraRun::serve(std::span<const pollfd> polled) {
   }
   bool goesOn = polled[0].revents == 0 || serveVideo(polled[0]);
   if (!goesOn) pairing_.endMetadata();
-  // A handler may end the stream.
+  // A handler may stop the stream.
   while (video_ != nullptr) {
     std::optional<CapturedFrame> frame = pairing_.next(video_->node().kernel().now());
     if (!frame) return goesOn;
@@ -144,7 +144,7 @@ bool CameraRun::serve(std::span<const pollfd> polled) {
   return false;
 }
 
-// False when the node delivers no more.
+// False if the node delivers no more buffers.
 bool CameraRun::serveMetadata(const pollfd& polled) {
   for (std::size_t i = 0; i < metadata_->count(); ++i) {
     DequeuedBuffer buffer;
@@ -162,8 +162,7 @@ bool CameraRun::serveMetadata(const pollfd& polled) {
   return true;
 }
 
-// False when the camera delivers no more. An event without a buffer means that too: to wait again would be to wait
-// for what is there already.
+// False if the camera delivers no more frames. That includes an event without a buffer, which would recur at once.
 bool CameraRun::serveVideo(const pollfd& polled) {
   for (std::size_t i = 0; i < video_->count(); ++i) {
     DequeuedBuffer buffer;
@@ -200,7 +199,7 @@ void CameraRun::hand(const CapturedFrame& frame) {
     ++counts_.missingMetadata;
   }
   delivered_->fetch_add(1, std::memory_order_relaxed);
-  const std::shared_ptr<PixelBufferHandler> handler = handler_;  // it may end the stream, which lets go of it
+  const std::shared_ptr<PixelBufferHandler> handler = handler_;  // keeps the handler alive if it stops the stream
   (*handler)(buffer, mediaTimeOf(frame.timestamp));
   buffer.release();
 }

@@ -1,4 +1,4 @@
-// CameraRun: one stretch of a camera's stream, from its start to its stop.
+// CameraRun: one streaming run of a camera, from start to stop.
 #pragma once
 
 #include "backends/capture/capture_back.h"
@@ -18,17 +18,17 @@
 
 namespace quazor {
 
-// What a stretch needs to know.
+// The parameters of a run.
 struct CameraRunPlan {
   CameraBinding camera;
-  FrameInterval interval;                       // between frames, as the driver has it
+  FrameInterval interval;                       // as set by the driver
   std::shared_ptr<PixelBufferHandler> handler;  // may be null: frames are then only counted
-  std::vector<ControlSetting> light;            // set before the first frame; empty: the projector stays dark
+  std::vector<ControlSetting> light;            // set before the first frame; empty: the projector stays off
   std::shared_ptr<V4l2Device> node;
   std::shared_ptr<V4l2Device> metadataNode;  // may be null
 };
 
-// Frames whose handlers have been called, of all cameras.
+// The number of frames passed to handlers, for all cameras.
 using DeliveredFrames = std::atomic<std::uint64_t>;
 
 // Thread: begin() and end() one at a time; the poller's thread serves in between; counts() and errorCounters() any.
@@ -37,16 +37,16 @@ class CameraRun final : public PolledStream, public CaptureRun {
   CameraRun(CameraRunPlan plan, std::shared_ptr<DeliveredFrames> delivered);
   ~CameraRun() override;
 
-  // Lights the projector, requests buffers and starts the stream: the metadata node first, so that its buffers are
-  // there for frame 0. On failure everything is as before.
+  // Switches the projector on, requests buffers and starts the stream; starts the metadata node first so that it has
+  // the metadata of frame 0. Undoes everything on failure.
   bool begin(DiagnosticErrorPtr* error);
-  // Stops the stream, puts the projector out and gives everything back, the nodes included. False, with the first
-  // error, when the system refused any of that. REQUIRES: the poller does not serve it, but on the calling thread.
+  // Stops the stream, switches the projector off and releases all resources including the nodes. Returns false with the
+  // first error if a step fails. REQUIRES: the poller does not serve this object, except on the calling thread.
   bool end(DiagnosticErrorPtr* error);
 
   FrameCounts counts() const;
   FrameInterval interval() const { return interval_; }
-  // ErrorCounters; nothing, and an error, when a counter of the binding cannot be read any more.
+  // ErrorCounters; nothing and an error if a counter of the binding can no longer be read.
   std::optional<Dictionary> errorCounters(DiagnosticErrorPtr* error) const;
 
   void watch(std::vector<pollfd>& descriptors) const override;
@@ -54,8 +54,8 @@ class CameraRun final : public PolledStream, public CaptureRun {
   bool serve(std::span<const pollfd> polled) override;
 
  private:
-  bool light(DiagnosticErrorPtr* error);
-  bool darken(DiagnosticErrorPtr* error);
+  bool enableProjector(DiagnosticErrorPtr* error);
+  bool disableProjector(DiagnosticErrorPtr* error);
   bool prepare(DiagnosticErrorPtr* error);
   bool serveMetadata(const pollfd& polled);
   bool serveVideo(const pollfd& polled);
@@ -74,18 +74,18 @@ class CameraRun final : public PolledStream, public CaptureRun {
   std::unique_ptr<ControlGuard> guard_;
   FramePairing pairing_;
 
-  // Until end(); then null, which needs the mutex for who is not the poller's thread.
+  // Null after end(). Only the poller's thread may read it without the mutex.
   std::shared_ptr<PixelBufferHandler> handler_;
   std::shared_ptr<V4l2Device> node_;
   std::shared_ptr<V4l2Device> metadataNode_;
   std::unique_ptr<CameraBuffers> video_;
   std::unique_ptr<CameraBuffers> metadata_;
 
-  mutable std::mutex mutex_;  // guards what follows
+  mutable std::mutex mutex_;  // guards the members below
   FrameCounts counts_;
   std::optional<BoundCounters> bound_;
-  std::optional<Dictionary> finalCounters_;  // as they were at the end
-  DiagnosticErrorPtr finalError_;            // when they could not be read then
+  std::optional<Dictionary> finalCounters_;  // the values at the end
+  DiagnosticErrorPtr finalError_;            // why they could not be read at the end
 };
 
 }  // namespace quazor

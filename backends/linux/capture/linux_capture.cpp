@@ -31,7 +31,7 @@ constexpr LinuxErrorCode codeOf(CaptureRefusal reason) {
   return LinuxErrorCode::kWrongState;
 }
 
-// The streams of one user, served by one thread. Thread: any.
+// The streams of one user and their thread. Thread: any.
 class LinuxStreaming final : public StreamingBack {
  public:
   explicit LinuxStreaming(std::shared_ptr<V4l2Api> kernel) : poller_(std::move(kernel)) {}
@@ -50,8 +50,8 @@ class LinuxStreaming final : public StreamingBack {
   CameraPoller poller_;
 };
 
-// V4L2 itself starts each camera when it is told to; whether the cameras of a group then run in step is the hardware's,
-// and what MulticamSessionStatus shows. Thread: any, but for prepareToOpen().
+// V4L2 starts each camera separately. The hardware determines whether the cameras of a group are synchronised, and
+// MulticamSessionStatus shows it. Thread: any, except prepareToOpen().
 class LinuxCaptureBack final : public CaptureBack {
  public:
   LinuxCaptureBack(const Binding& binding, std::shared_ptr<LinuxCameras> shared) : shared_(std::move(shared)) {
@@ -75,7 +75,7 @@ class LinuxCaptureBack final : public CaptureBack {
   }
 
  private:
-  // A group that names no camera of the binding is left out; the reader of bindings refuses those.
+  // Skips a group with an unknown camera, which the reader of bindings rejects.
   void addGroup(const GroupBinding& group) {
     CaptureGroupInfo info;
     info.name = "group";

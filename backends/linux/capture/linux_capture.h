@@ -1,4 +1,4 @@
-// The capture service on V4L2: cameras of a binding, each on a video node of its own.
+// The capture service on V4L2: the cameras of a binding, each with its own video node.
 #pragma once
 
 #include "backends/linux/binding/binding.h"
@@ -11,14 +11,14 @@
 
 namespace quazor {
 
-// docs/linux_capture.md says what each property and counter is here.
+// docs/linux_capture.md describes the meaning of each property and counter.
 //
-// A camera's node is looked for and opened when control of its stream is taken, and closed when that is given back, so
-// a camera that was removed and came back is found again.
+// The node of a camera is looked up and opened when a user takes control of its stream, and closed when control is
+// released. A camera that was reconnected is therefore found again.
 // Thread: any.
 class LinuxCapture : public CaptureService {
  public:
-  // How many frames the cameras have handed to handlers. Any thread.
+  // The number of frames passed to handlers. Thread: any.
   virtual std::uint64_t framesDelivered() const = 0;
 };
 

@@ -6,7 +6,7 @@
 namespace quazor {
 namespace {
 
-// Made-up cameras, all of which expose automatically when they are told to.
+// Fake cameras, all of which support automatic exposure.
 class LinuxCaptureUnderTest {
  public:
   LinuxCaptureUnderTest() {

@@ -1,4 +1,4 @@
-// A machine with four made-up cameras, and a user of their capture device, for the tests of this folder.
+// A machine with four fake cameras and a user of their capture device, for the tests of this folder.
 #pragma once
 
 #include "backends/linux/capture/linux_capture.h"
@@ -25,7 +25,7 @@ namespace quazor {
 inline constexpr std::uint32_t kStrobe = V4L2_CID_FLASH_LED_MODE;
 inline constexpr std::uint32_t kPower = V4L2_CID_FLASH_TORCH_INTENSITY;
 
-// What a call that takes an error out-argument ended in: "done", or the error's code and message.
+// The result of a call with an error out-argument: "done", or the code and message of the error.
 template <class Call>
 std::string outcome(Call&& call) {
   DiagnosticErrorPtr error;
@@ -35,8 +35,8 @@ std::string outcome(Call&& call) {
 
 inline std::string text(std::string_view key) { return std::string(key); }
 
-// Binds the ports of the back to buses fake:0 to fake:2 and the infrared one, which has a projector and a metadata
-// node, to fake:3. All frames are 640 x 360.
+// Binds the back camera ports to buses fake:0 to fake:2 and the infrared port, with a projector and a metadata node, to
+// fake:3. All frames are 640 x 360.
 inline Binding fakeBinding() {
   Binding binding;
   int bus = 0;
@@ -97,7 +97,7 @@ class FakeCameras {
   std::string stop(std::size_t index) const {
     return outcome([&](auto* error) { return streams[index]->stop(error); });
   }
-  // Takes control of it and sets the usual format and rate.
+  // Takes control of the stream and sets the default format and rate.
   void prepare(std::size_t index) const {
     ASSERT_EQ(take(index), "done");
     ASSERT_EQ(set(*streams[index], capture_key::FormatIndex, 0), "done");
@@ -116,7 +116,7 @@ class FakeCameras {
                       {text(capture_key::StructuredLightPattern), pattern},
                       {text(capture_key::StructuredLightCurrent), current}};
   }
-  // A number of ErrorCounters; -1 when there is none.
+  // A number from ErrorCounters; -1 if it is missing.
   std::int64_t counter(std::size_t index, std::string_view name) const {
     const std::optional<Value> counters = streams[index]->valueForProperty(capture_key::ErrorCounters, nullptr);
     const Value* const number = entryOf(pointerTo(counters), name);
@@ -141,13 +141,13 @@ class FakeCameras {
   std::shared_ptr<SynchronizedStreamsGroup> group;
 };
 
-// What a handler got.
+// A frame as a handler received it.
 struct SeenFrame {
   std::int64_t time = 0;  // nanoseconds
   Dictionary metadata;
 };
 
-// A handler's memory. Thread: any.
+// Collects the frames that a handler receives. Thread: any.
 class SeenFrames {
  public:
   PixelBufferHandler::Function handler() {
@@ -158,7 +158,7 @@ class SeenFrames {
       changed_.notify_all();
     };
   }
-  // Once there are so many, or after some seconds.
+  // Waits for that many frames, for at most a few seconds.
   std::vector<SeenFrame> wait(std::size_t count) {
     std::unique_lock lock(mutex_);
     changed_.wait_for(lock, std::chrono::minutes(1), [&] { return frames_.size() >= count; });

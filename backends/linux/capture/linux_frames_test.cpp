@@ -1,4 +1,4 @@
-// Streaming over a made-up driver: what handlers get, what is counted, how every failure ends.
+// Streaming with a fake driver: frames, counters and every failure.
 #include "backends/linux/capture/camera_frames.h"
 #include "backends/linux/capture/linux_capture_for_tests.h"
 #include "backends/linux/video/v4l2_device.h"
@@ -284,7 +284,7 @@ TEST(LinuxFramesTest, WhatTheSystemRefusesAtTheStartLeavesNothingBusy) {
        [](Fake& fake) {
          fake.kernel->with(fake.nodes[kInfrared], [](FakeNode& node) { return node.mostBuffers = 0; });
        },
-       "1 VIDIOC_REQBUFS on NODE gave no buffers."},
+       "1 VIDIOC_REQBUFS on NODE provided no buffers."},
       {"no process for the guard", [](Fake& fake) { fake.kernel->guardProblem = EAGAIN; },
        "1 guarding the projector on NODE failed: Resource temporarily unavailable (EAGAIN)"},
       {"no event for the thread", [](Fake& fake) { fake.kernel->makeEventProblem = EMFILE; },
@@ -306,7 +306,7 @@ TEST(LinuxFramesTest, WhatTheSystemRefusesAtTheStartLeavesNothingBusy) {
        "5 NODE has no control \"Gain\"."},
       {"a control that puts the projector out",
        [](Fake& fake) {
-         fake.kernel->with(fake.nodes[kInfrared], [](FakeNode& node) { return node.controls[0].highest = 1; });
+         fake.kernel->with(fake.nodes[kInfrared], [](FakeNode& node) { return node.controls[0].maximum = 1; });
        },
        "done"},
   };

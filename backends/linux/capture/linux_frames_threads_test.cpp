@@ -1,4 +1,4 @@
-// Handlers that call back, and threads that stop, invalidate and take cameras meanwhile.
+// Handlers that call the service, and threads that concurrently stop, invalidate and take cameras.
 #include "backends/linux/capture/linux_capture_for_tests.h"
 
 #include <pthread.h>
@@ -49,7 +49,7 @@ TEST(LinuxFramesThreadsTest, AHandlerMayLetGoOfAStreamThatRuns) {
   EXPECT_TRUE(fake.kernel->isIdle());
 }
 
-// Holds a handler until it is let go on.
+// Blocks a handler until open() is called.
 class Gate {
  public:
   void enter() {
@@ -195,7 +195,7 @@ TEST(LinuxFramesThreadsTest, WhileOneThreadStopsAHandlerMayInvalidate) {
   fake.kernel->produce(fake.nodes[0]);
   gate.awaitEntry();
   std::thread stopper([&] { stopped = fake.stop(0); });
-  std::this_thread::sleep_for(5ms);  // by then it waits for the handler, mostly
+  std::this_thread::sleep_for(5ms);  // usually it waits for the handler by then
   gate.open();
   stopper.join();
   EXPECT_TRUE(stopped == "done" || stopped == "7 The capture device has been invalidated; ask for a new one.")

@@ -12,7 +12,7 @@ Dictionary configuration(const Fake& fake) {
   return Dictionary{{text(capture_key::ActiveSynchronizedStreamsGroups), Array{fake.group}}};
 }
 
-// Takes the three cameras of the back and makes them a session.
+// Takes control of the three back cameras and creates a session for them.
 void synchronize(const Fake& fake) {
   for (std::size_t i = 0; i < 3; ++i) fake.prepare(i);
   ASSERT_EQ(fake.set(*fake.group, capture_key::ActiveStreams, arrayOf(fake.backStreams())), "done");

@@ -48,9 +48,9 @@ TEST(LinuxStreamTest, WhatNoVideoNodeCanDoIsRefused) {
   EXPECT_EQ(set(kSlave, slave(false, false, 1)),
             "5 " + name + "StreamingOutputsEnabled can only be 1 here, not the boolean 0.");
   EXPECT_EQ(set(capture_key::InfraredLightSourceConfiguration, Fake::light(1, 0, 101)),
-            "6 " + name + "the control \"Power\" takes 0 to 100, not 101.");
+            "6 " + name + "the control \"Power\" accepts 0 to 100, not 101.");
   EXPECT_EQ(set(capture_key::MinimumFrameRate, 0.009),
-            "6 " + name + "no driver takes less than 0.01 frames per second.");
+            "6 " + name + "no driver supports less than 0.01 frames per second.");
   EXPECT_EQ(set(capture_key::MaximumFrameRate, 10'001),
             "6 " + name + "MaximumFrameRate must be a number above 0 and at most 10000, not the number 10001.");
 }
@@ -75,7 +75,7 @@ TEST(LinuxStreamTest, ARateThatTheDriverSilentlyChangesIsRefusedWithTheDriversOw
   ASSERT_EQ(fake.set(fake.wide(), capture_key::MinimumFrameRate, 30), "done");
   EXPECT_EQ(fake.set(fake.wide(), capture_key::MaximumFrameRate, 30),
             "5 BackFacingCamera: " + fake.nodes[0] +
-                " does not take 1/30 s between frames in this format; its driver gives 1/25 s instead, which is 25 "
+                " does not support 1/30 s between frames in this format; its driver uses 1/25 s instead, which is 25 "
                 "frames per second.");
   EXPECT_EQ(get(fake, capture_key::MaximumFrameRate), std::nullopt);
 }
@@ -215,7 +215,7 @@ TEST(LinuxStreamTest, AProjectorsSetOfBitsTakesEveryNumber) {
   fake.kernel->with(fake.nodes[3], [](FakeNode& node) {
     FakeControl& power = *std::ranges::find(node.controls, kPower, &FakeControl::id);
     power.type = V4L2_CTRL_TYPE_BITMASK;
-    return power.highest = 0;
+    return power.maximum = 0;
   });
   ASSERT_EQ(fake.take(3), "done");
   EXPECT_EQ(fake.set(fake.infrared(), capture_key::InfraredLightSourceConfiguration, Fake::light(2, 0, 5)), "done");

@@ -18,26 +18,25 @@ namespace {
 constexpr std::string_view kNameAsKey = "{name}";
 constexpr int kMaxProcessors = 65536;
 
-// Also a link that leads to itself leads nowhere.
+// Includes a link to itself.
 bool isNotThere(int number) { return number == ENOENT || number == ENOTDIR || number == ENODEV || number == ELOOP; }
 
-// Looks for the files of a path whose components are patterns.
+// Finds the files that match a path of patterns.
 class Walk {
  public:
-  // What is found: the file, and what the placeholders stood for. False: to stop.
-  using ResultsReported = std::function<bool(const std::string& file, const ChannelNames& names)>;
+  // Called for each match, with the texts that the placeholders matched. Returns false to stop.
+  using OnFound = std::function<bool(const std::string& file, const ChannelNames& names)>;
 
-  Walk(CounterSystem& system, std::string_view path, ResultsReported found)
-      : system_(system), found_(std::move(found)) {
+  Walk(CounterSystem& system, std::string_view path, OnFound found) : system_(system), found_(std::move(found)) {
     for (std::size_t begin = 1; begin <= path.size();) {
       const std::size_t end = std::min(path.find('/', begin), path.size());
       components_.emplace_back(path.substr(begin, end - begin));
-      patterns_.push_back(NamePattern::parse(components_.back()));  // as the binding's reader checked
+      patterns_.push_back(NamePattern::parse(components_.back()));  // checked by the reader of the binding
       begin = end + 1;
     }
   }
 
-  // False when something cannot be looked at, or it was told to stop.
+  // False if a directory cannot be read or the callback stopped the search.
   bool run(DiagnosticErrorPtr* error) {
     error_ = error;
     return below("", 0, {});
@@ -91,7 +90,7 @@ class Walk {
   }
 
   CounterSystem& system_;
-  const ResultsReported found_;
+  const OnFound found_;
   std::vector<std::string> components_;
   std::vector<NamePattern> patterns_;
   DiagnosticErrorPtr* error_ = nullptr;
@@ -141,7 +140,7 @@ class Enumeration {
     std::string_view text = content;
     std::unordered_set<std::string_view> keys;
     while (const std::optional<KeyedLine> line = takeKeyedLine(&text)) {
-      if (!keys.insert(line->key).second || !line->count) continue;  // of lines with the same key the first one holds
+      if (!keys.insert(line->key).second || !line->count) continue;  // of equal keys the first line counts
       description.name = line->key;
       addFile(description, file, description.name);
     }
@@ -153,13 +152,13 @@ class Enumeration {
     return false;
   }
 
-  // `path` is SYSTEM/EVENT/id. False, and an error, when it may not be read.
+  // `path` is SYSTEM/EVENT/id. Returns false and an error if reading it is not permitted.
   bool addTracepoint(const TracepointBinding& tracepoints, const std::string& file, std::string_view path) {
     std::string content;
     const int failure = system_.read(file, &content);
     if (isNoAccess(failure)) return refuse(file, failure);
     const std::optional<std::uint64_t> id = failure == 0 ? countIn(content) : std::nullopt;
-    if (!id) return true;  // it has gone meanwhile
+    if (!id) return true;  // it was removed in the meantime
     const std::string system(path.substr(0, path.find('/')));
     const std::string event(path.substr(system.size() + 1, path.rfind('/') - system.size() - 1));
     channels_.push_back({{tracepoints.group.value_or("tracepoints"), tracepoints.subgroup.value_or(system),
@@ -221,7 +220,7 @@ std::vector<int> processorsIn(std::string_view list) {
     at = afterFirst;
     if (at != end && *at == '-') at = std::from_chars(at + 1, end, last).ptr;
     for (int one = first; one <= std::min(last, kMaxProcessors); ++one) processors.push_back(one);
-    if (at != end) ++at;  // the comma, or the end of the line
+    if (at != end) ++at;  // skips the comma
   }
   return processors;
 }

@@ -19,7 +19,7 @@ CounterFilesBinding files(std::string path, std::optional<std::string> group, st
   return {std::move(path), std::move(group), std::move(subgroup), std::move(name), std::move(key)};
 }
 
-// "group|subgroup|name file key id" of each.
+// "GROUP|SUBGROUP|NAME FILE KEY ID" for each channel.
 std::vector<std::string> channelsOf(const Binding& binding, CounterSystem& system) {
   DiagnosticErrorPtr error;
   const std::optional<std::vector<CounterChannel>> channels = counterChannels(binding, system, &error);
@@ -84,7 +84,7 @@ TEST(CounterChannels, AreOneForAllLinesOfOneKey) {
   system.files["/stat"] = "a 1\nb x\na 2\nb 3\n";
   Binding binding;
   binding.counterFiles = {files("/stat", "g", "s", std::nullopt, "{name}")};
-  EXPECT_THAT(channelsOf(binding, system), ElementsAre("g|s|a /stat a"));  // of the key b the first line is no count
+  EXPECT_THAT(channelsOf(binding, system), ElementsAre("g|s|a /stat a"));  // the first line of key b is not a count
 }
 
 TEST(CounterChannels, LeaveOutWhatIsKnownToGoDown) {
@@ -116,7 +116,7 @@ TEST(CounterChannels, AreTracepointsInEitherPlace) {
 }
 
 TEST(CounterChannels, AreTracepointsOfTheFirstPlaceThatThereIs) {
-  // With tracefs mounted for this user, an event that is not there is no reason to look where only root may.
+  // If tracefs is mounted for this user, a missing event must not lead to a directory that only root may read.
   FakeCounters system;
   system.files["/sys/kernel/tracing/events/vb2/vb2_qbuf/id"] = "8\n";
   system.failures["/sys/kernel/debug/tracing/events"] = EACCES;

@@ -14,7 +14,7 @@ namespace quazor {
 namespace {
 
 constexpr std::size_t kMaxFileLength = std::size_t{1024} * 1024;
-constexpr std::size_t kChunk = 4096;  // what most files of the kernel hold at the most
+constexpr std::size_t kChunk = 4096;  // the maximum size of most kernel files
 
 EntryKind kindOf(unsigned char type) {
   switch (type) {
@@ -33,7 +33,7 @@ class RunningSystem final : public CounterSystem {
     const std::unique_ptr<DIR, int (*)(DIR*)> open(::opendir((root_ + directory).c_str()), ::closedir);
     if (open == nullptr) return errno;
     for (;;) {
-      errno = 0;  // readdir leaves it so at the end; what follows may set it
+      errno = 0;  // tells the end from an error of readdir()
       const dirent* const entry = ::readdir(open.get());
       if (entry == nullptr) return errno;
       const std::string_view name = entry->d_name;

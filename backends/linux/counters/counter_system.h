@@ -1,4 +1,4 @@
-// CounterSystem: what the report facility asks of the system, so that made-up files can stand in for it.
+// CounterSystem: the system calls of the report facility, replaceable in tests.
 #pragma once
 
 #include "backends/linux/system/file_descriptor.h"
@@ -16,7 +16,7 @@ namespace quazor {
 enum class EntryKind {
   kFile,
   kDirectory,
-  kOther  // a link, or what the file system does not say
+  kOther  // a link, or unknown to the file system
 };
 
 struct DirectoryEntry {
@@ -24,7 +24,7 @@ struct DirectoryEntry {
   EntryKind kind = EntryKind::kOther;
 };
 
-// Every call gives 0 or the error number.
+// Every call returns 0 or an error number.
 // Thread: any.
 class CounterSystem {
  public:
@@ -33,22 +33,22 @@ class CounterSystem {
   CounterSystem& operator=(const CounterSystem&) = delete;
   virtual ~CounterSystem() = default;
 
-  // What the directory holds, without "." and "..", in no order.
+  // The entries of the directory, without "." and "..", unsorted.
   virtual int list(const std::string& directory, std::vector<DirectoryEntry>* entries) = 0;
-  // Whether that is a file: ENOENT when it is none.
+  // Checks that the path is a file; returns ENOENT if it is not.
   virtual int find(const std::string& file) = 0;
-  // The whole file. A file that nobody may read gives EINVAL, one longer than a mebibyte EFBIG.
+  // Reads the whole file. Returns EINVAL if the file is not readable, EFBIG if it exceeds one mebibyte.
   virtual int read(const std::string& file, std::string* content) = 0;
-  // Begins to count a tracepoint on one processor, for all processes. What is read of the descriptor is the count, 8
-  // bytes in the machine's order.
+  // Starts to count a tracepoint on one processor, for all processes. Reading the descriptor returns the count as 8
+  // bytes in native byte order.
   virtual int openTracepoint(std::uint64_t id, int processor, FileDescriptor* counter) = 0;
 };
 
-// perf_event_open(2), as the system has it.
+// The signature of perf_event_open(2).
 using PerfEventOpen = int (*)(perf_event_attr* attributes, int process, int processor, int group, unsigned long flags);
 int systemPerfEventOpen(perf_event_attr* attributes, int process, int processor, int group, unsigned long flags);
 
-// The running system's. `root` stands before every path.
+// The running system. `root` is prepended to every path.
 std::shared_ptr<CounterSystem> systemCounters(const std::filesystem::path& root = {},
                                               PerfEventOpen perfEventOpen = systemPerfEventOpen);
 

@@ -1,4 +1,4 @@
-// FakeCounters: files and tracepoints that tests make up.
+// FakeCounters: fake files and tracepoints.
 #pragma once
 
 #include "backends/linux/counters/counter_system.h"
@@ -18,11 +18,11 @@ namespace quazor {
 class FakeCounters final : public CounterSystem {
  public:
   std::map<std::string, std::string> files;
-  std::map<std::string, int> failures;  // of files and directories: the error number of every call
+  std::map<std::string, int> failures;  // of files and directories: the error number that every call returns
   std::map<std::pair<std::uint64_t, int>, int> tracepointFailures;  // by ID and processor
-  // What the count of a tracepoint on a processor reads as, one time after the other, and then as nothing.
+  // The successive counts of a tracepoint on a processor; reads fail after the last one.
   std::map<std::pair<std::uint64_t, int>, std::vector<std::uint64_t>> tracepointCounts;
-  int opened = 0;  // tracepoints on processors
+  int opened = 0;  // the number of tracepoint counters opened
   int reads = 0;
 
   int list(const std::string& directory, std::vector<DirectoryEntry>* entries) override {
@@ -35,7 +35,7 @@ class FakeCounters final : public CounterSystem {
       found[rest.substr(0, slash)] = slash == std::string::npos ? EntryKind::kFile : EntryKind::kDirectory;
     }
     if (found.empty()) return files.contains(directory) ? ENOTDIR : ENOENT;
-    // In another order than that of the names.
+    // Not sorted by name.
     for (auto entry = found.rbegin(); entry != found.rend(); ++entry) entries->push_back({entry->first, entry->second});
     return 0;
   }

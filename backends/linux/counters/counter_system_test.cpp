@@ -134,7 +134,7 @@ TEST(SystemCounters, CountTracepointsOfAllProcesses) {
 }
 
 TEST(SystemCounters, AskTheKernelItself) {
-  // Without rights, tracefs or such a tracepoint: some error; never a counter of it.
+  // The error depends on permissions and on tracefs, but there must be no counter.
   FileDescriptor counter;
   EXPECT_NE(systemCounters()->openTracepoint(0xFFFFFFFFFFFF, 0, &counter), 0);
   EXPECT_FALSE(counter);

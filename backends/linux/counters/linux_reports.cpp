@@ -19,15 +19,15 @@
 namespace quazor {
 namespace {
 
-// A tracepoint on all processors; it counts as long as it is there.
+// A tracepoint on all processors; counts during the lifetime of this object.
 class TracepointCount {
  public:
-  // False, and the call's error number, when it cannot be counted.
+  // Returns false and the error number of the call if the tracepoint cannot be counted.
   bool open(std::uint64_t id, const std::vector<int>& processors, CounterSystem& system, int* failure) {
     for (const int processor : processors) {
       FileDescriptor counter;
       *failure = system.openTracepoint(id, processor, &counter);
-      if (*failure == ENODEV) continue;  // the processor is off now
+      if (*failure == ENODEV) continue;  // the processor is now offline
       if (*failure != 0) return false;
       counters_.push_back(std::move(counter));
     }
@@ -35,7 +35,7 @@ class TracepointCount {
   }
 
   std::optional<std::uint64_t> total() const {
-    if (counters_.empty()) return std::nullopt;  // no processor counts it
+    if (counters_.empty()) return std::nullopt;  // counted on no processor
     std::uint64_t total = 0;
     for (const FileDescriptor& counter : counters_) {
       std::uint64_t count = 0;
@@ -49,12 +49,12 @@ class TracepointCount {
   std::vector<FileDescriptor> counters_;
 };
 
-// The counts of one file; asked for the channels of the same file one after the other, it reads it once.
+// Reads the counts of files; reads a file once for consecutive channels.
 class FileReader {
  public:
   explicit FileReader(CounterSystem& system) : system_(system) {}
 
-  // False, and an error, when the file may not be read.
+  // Returns false and an error if reading the file is not permitted.
   bool read(const CounterChannel& channel, std::optional<std::uint64_t>* count, DiagnosticErrorPtr* error) {
     const bool isKeyed = !channel.key.empty();
     if (!isKeyed || channel.file != fileOfLines_) {
@@ -83,10 +83,10 @@ class FileReader {
   }
 
   CounterSystem& system_;
-  std::string fileOfLines_;  // empty: what was read last has no lines
+  std::string fileOfLines_;  // empty: the last file has no lines
   std::string content_;
   int failure_ = 0;
-  std::unordered_map<std::string_view, std::optional<std::uint64_t>> lines_;  // of the content
+  std::unordered_map<std::string_view, std::optional<std::uint64_t>> lines_;  // point into the content
 };
 
 class LinuxCounters final : public CounterChannels {
@@ -100,7 +100,7 @@ class LinuxCounters final : public CounterChannels {
   std::optional<CounterValues> read(const std::vector<std::size_t>& indexes, DiagnosticErrorPtr* error) override {
     const std::lock_guard lock(mutex_);
     if (!openTracepoints(indexes, error)) return std::nullopt;
-    // Nothing but reading from here on, so that the values are close together.
+    // Only reads from here on: the values must be close together in time.
     CounterValues counts(indexes.size());
     FileReader files(*system_);
     for (std::size_t i = 0; i < indexes.size(); ++i) {
@@ -120,7 +120,7 @@ class LinuxCounters final : public CounterChannels {
   }
 
  private:
-  // All of them, or none: one that fails lets go of what was opened with it.
+  // Opens all of them, or none if one fails.
   bool openTracepoints(const std::vector<std::size_t>& indexes, DiagnosticErrorPtr* error) {
     std::optional<std::vector<int>> processors;
     std::unordered_map<std::uint64_t, TracepointCount> opened;
@@ -133,7 +133,7 @@ class LinuxCounters final : public CounterChannels {
       int failure = 0;
       if (counter.open(*channel.tracepoint, *processors, *system_, &failure)) {
         opened.emplace(*channel.tracepoint, std::move(counter));
-      } else if (failure != ENOENT) {  // which is of a tracepoint that has gone
+      } else if (failure != ENOENT) {  // ENOENT: the tracepoint was removed
         failSystemCall(error, "perf_event_open", "the tracepoint " + channel.file, failure);
         return false;
       }
@@ -162,7 +162,7 @@ std::shared_ptr<ReportFacility> makeLinuxReports(const Binding& binding) {
 }
 
 std::shared_ptr<ReportFacility> makeLinuxReports(const Binding& binding, std::shared_ptr<CounterSystem> system) {
-  Binding counters;  // nothing else of the binding
+  Binding counters;  // only its counters are set
   counters.counterFiles = binding.counterFiles;
   counters.tracepoints = binding.tracepoints;
   return makeCounterReports([counters = std::move(counters), system = std::move(system)](

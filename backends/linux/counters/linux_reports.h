@@ -9,13 +9,13 @@
 
 namespace quazor {
 
-// Every call of reportWithOnlySimpleChannels() looks for the channels again; docs/linux.md describes them.
+// Every call of reportWithOnlySimpleChannels() searches for the channels again; docs/linux.md describes them.
 //
-// A channel whose file has gone, or holds no whole number of at most 64 bits, has no count; differences are those of
-// makeCounterReports(). A tracepoint counts from the first snapshot of a set that it is in; its count there is of the
-// time since it was opened, about 0.
+// A channel has no count if its file was removed or does not contain an integer of at most 64 bits. Differences are
+// those of makeCounterReports(). A tracepoint is counted from the first snapshot of a set that includes it; its count
+// in that snapshot is about 0.
 //
-// Errors: LinuxErrorDomain. What may not be looked at or read (kNoAccess) fails the call.
+// Errors: LinuxErrorDomain. A missing permission (kNoAccess) fails the call.
 // Thread: any.
 std::shared_ptr<ReportFacility> makeLinuxReports(const Binding& binding);
 // The same, on another system than the running one.

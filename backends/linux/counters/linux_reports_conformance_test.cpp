@@ -13,7 +13,7 @@
 namespace quazor {
 namespace {
 
-// A file for each channel.
+// Uses one file per channel.
 class LinuxCountersUnderTest {
  public:
   void make(std::vector<ConformanceChannel> channels) {

@@ -28,7 +28,7 @@ Binding bindingOf(std::string path, std::optional<std::string> key = std::nullop
   return binding;
 }
 
-// "name=count" of each sample.
+// "NAME=COUNT" for each sample.
 std::vector<std::string> textsOf(const std::shared_ptr<const ReportSnapshot>& snapshot) {
   std::vector<std::string> texts;
   if (snapshot == nullptr) return {"no snapshot"};
@@ -195,7 +195,7 @@ TEST_F(TracepointReportsTest, CountsOnAllProcessorsFromTheFirstSnapshotOn) {
   EXPECT_THAT(textsOf(set->snapshot(nullptr)->snapshotWithBaseline(*baseline, nullptr)),
               ElementsAre("in=122", "out=0"));
   EXPECT_EQ(system_->opened, 4);
-  EXPECT_THAT(snapshotOf(set), ElementsAre("in=none", "out=none"));  // nothing more to read
+  EXPECT_THAT(snapshotOf(set), ElementsAre("in=none", "out=none"));  // there are no more values to read
 }
 
 TEST_F(TracepointReportsTest, CountsOnlyWhatTheSetHolds) {
@@ -246,7 +246,7 @@ TEST_F(TracepointReportsTest, FailsWithoutTheRightToCount) {
   EXPECT_EQ(error_->code(), static_cast<std::int64_t>(LinuxErrorCode::kNoAccess));
 }
 
-// A tree of a thousand files for each thousand of channels that is asked for, made up as it is read.
+// A tree with a thousand files per directory, generated on access.
 class ManyCounters final : public CounterSystem {
  public:
   explicit ManyCounters(int thousands) : thousands_(thousands) {}
@@ -274,8 +274,8 @@ std::chrono::nanoseconds processorTime() {
   return std::chrono::seconds(time.tv_sec) + std::chrono::nanoseconds(time.tv_nsec);
 }
 
-// Enumerates, filters, and takes a delta of so many thousands of channels. This thread's time for it all, without what
-// others do on the machine meanwhile.
+// The processor time of this thread for enumerating, filtering and comparing that many thousands of channels. Other
+// processes do not affect it.
 std::chrono::nanoseconds timeOf(int thousands) {
   Binding binding;
   binding.counterFiles = {{"/many/{subgroup}/{name}", "g", std::nullopt, std::nullopt, std::nullopt}};
@@ -293,13 +293,13 @@ std::chrono::nanoseconds timeOf(int thousands) {
 #ifdef NDEBUG
 constexpr int kManyThousands = 1000;
 #else
-constexpr int kManyThousands = 100;  // code that is not optimised takes many times as long
+constexpr int kManyThousands = 100;  // unoptimised code takes many times as long
 #endif
 
 TEST(LinuxReports, TakeTimeThatIsLinearInTheChannels) {
   const std::chrono::nanoseconds small = timeOf(kManyThousands / 10);
   const std::chrono::nanoseconds large = timeOf(kManyThousands);
-  EXPECT_LT(large, small * 30);  // ten times as many; what grows with the square takes a hundred times as long
+  EXPECT_LT(large, small * 30);  // ten times as many channels; quadratic time would be a factor of a hundred
 }
 
 TEST(LinuxReports, ReadRealFiles) {

@@ -19,11 +19,11 @@ std::string lineOf(const std::filesystem::path& file) {
 std::vector<DisplayConnector> displayConnectors(const std::filesystem::path& sysfs) {
   std::vector<DisplayConnector> connectors;
   std::error_code failure;
-  // What cannot be listed, or goes while it is listed, has no more connectors.
+  // An error while listing ends the list.
   for (std::filesystem::directory_iterator at(sysfs / "class/drm", failure); !failure && at != end(at);
        at.increment(failure)) {
     const std::filesystem::path& path = at->path();
-    // Beside them are the cards themselves, "card0", and their nodes to draw by, "renderD128".
+    // The directory also contains the cards ("card0") and the render nodes ("renderD128").
     const std::string name = path.filename();
     const std::size_t dash = name.find('-');
     if (!name.starts_with("card") || dash == std::string::npos) continue;

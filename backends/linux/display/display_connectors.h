@@ -1,4 +1,4 @@
-// The connectors of this machine's displays, as DRM's sysfs shows them.
+// The display connectors of this machine, from DRM's sysfs.
 #pragma once
 
 #include <filesystem>
@@ -8,10 +8,10 @@
 
 namespace quazor {
 
-// The words of the kernel; empty what cannot be read.
+// The kernel's texts; empty if they cannot be read.
 struct DisplayConnector {
-  std::string card;     // as "card0"
-  std::string name;     // as "Virtual-1"
+  std::string card;     // for example "card0"
+  std::string name;     // for example "Virtual-1"
   std::string status;   // connected, disconnected or unknown
   std::string enabled;  // enabled or disabled
   std::string dpms;     // On, Standby, Suspend or Off
@@ -20,7 +20,7 @@ struct DisplayConnector {
   bool isPowered() const { return isConnected() && enabled == "enabled" && dpms == "On"; }
 };
 
-// All of them, by card and name.
+// All connectors, sorted by card and name.
 std::vector<DisplayConnector> displayConnectors(const std::filesystem::path& sysfs = "/sys");
 
 }  // namespace quazor

@@ -15,7 +15,7 @@ constexpr std::string_view kDebugInfo = "DSPLY Debug Info";
 constexpr const char* kPowerInfo = "DSPLY power info";
 constexpr const char* kPanel = "DSPLY power info panel";
 
-// The connector as it is now; nothing when it is not there.
+// The current state of the connector; nothing if it does not exist.
 std::optional<DisplayConnector> connectorNamed(const std::string& name, const std::filesystem::path& sysfs) {
   for (DisplayConnector& connector : displayConnectors(sysfs)) {
     if (connector.name == name && !connector.status.empty()) return std::move(connector);

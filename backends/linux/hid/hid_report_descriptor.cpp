@@ -9,12 +9,12 @@
 namespace quazor {
 namespace {
 
-// 6.2.2.2 and 6.2.2.3: the first byte of an item is its tag, its type and its size.
+// 6.2.2.2 and 6.2.2.3: the first byte of an item contains its tag, type and size.
 constexpr std::uint8_t kLongItem = 0xFE;
 constexpr std::uint8_t kTagAndType = 0xFC;
 constexpr std::uint8_t kSize = 0x03;
 
-// The tag and the type of the short items that matter here.
+// The tags and types of the relevant short items.
 enum Item : std::uint8_t {
   kInput = 0x80,
   kOutput = 0x90,
@@ -31,9 +31,9 @@ enum Item : std::uint8_t {
   kUsageMinimum = 0x18
 };
 
-constexpr std::size_t kMaxDepth = 64;  // of collections, and of pushes
+constexpr std::size_t kMaxDepth = 64;  // of nested collections and of pushes
 
-// 6.2.2.7: what holds until it is changed.
+// 6.2.2.7: persists until it is changed.
 struct GlobalState {
   std::uint16_t usagePage = 0;
   std::uint32_t reportSize = 0;  // of one field, in bits
@@ -41,10 +41,10 @@ struct GlobalState {
   std::uint8_t reportID = 0;
 };
 
-// 6.2.2.8: what holds for the next main item only.
+// 6.2.2.8: applies only to the next main item.
 struct LocalUsage {
   std::uint16_t usage = 0;
-  std::optional<std::uint16_t> page;  // of a usage that has its own
+  std::optional<std::uint16_t> page;  // of a usage that includes one
 };
 
 using Bits = std::map<std::uint8_t, std::uint64_t>;
@@ -84,14 +84,14 @@ class Parser {
     take(prefix & kTagAndType, data, size);
   }
 
-  // No long item is defined.
+  // The standard defines no long items.
   void skipLongItem() {
     const std::size_t size = at_ < bytes_.size() ? std::size_t{2} + bytes_[at_] : 1;
     if (bytes_.size() - at_ < size) refuse("an item is cut off");
     at_ += size;
   }
 
-  // All that is not listed changes neither usages nor lengths.
+  // Other items affect neither usages nor lengths.
   void take(std::uint8_t item, std::uint32_t data, std::size_t size) {
     switch (item) {
       case kInput: addField(input_); break;
@@ -128,8 +128,8 @@ class Parser {
     pushed_.pop_back();
   }
 
-  // The first usage of a main item is the one that counts. In four bytes it has its page, else the page is the one that
-  // holds at the main item.
+  // Only the first usage of a main item counts. Four bytes include its page; otherwise the page in effect at the main
+  // item applies.
   void setUsage(std::uint32_t data, std::size_t size) {
     if (local_) return;
     local_ = LocalUsage{static_cast<std::uint16_t>(data), std::nullopt};
@@ -171,7 +171,7 @@ class Parser {
 
   const std::span<const std::uint8_t> bytes_;
   std::size_t at_ = 0;
-  std::size_t begin_ = 0;  // of the item
+  std::size_t begin_ = 0;  // offset of the item
   GlobalState global_;
   std::vector<GlobalState> pushed_;
   std::optional<LocalUsage> local_;

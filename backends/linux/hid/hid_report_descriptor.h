@@ -11,21 +11,20 @@
 namespace quazor {
 
 struct HidReportDescriptor {
-  // The largest report that Linux takes, in bytes.
+  // The largest report that Linux supports, in bytes.
   static constexpr std::uint32_t kMaxReport = 16384;
 
-  // One for each top-level collection, in their order; the first is the device's primary one. A collection without a
-  // usage has page 0, usage 0.
+  // The usages of the top-level collections, in order; the first is the device's primary one. A collection without a
+  // usage has page 0 and usage 0.
   std::vector<HidUsage> topLevel;
-  // False: reports carry no ID, and what is said of report 0 holds for the only one.
+  // False: reports have no ID, and the entries for ID 0 describe the only report.
   bool numbered = false;
-  // The length of each report in bytes, with the byte of its ID where reports are numbered, by ID.
+  // The length of each report in bytes by its ID, including the ID byte if reports are numbered.
   std::map<std::uint8_t, std::uint32_t> inputReports;
   std::map<std::uint8_t, std::uint32_t> featureReports;
 };
 
-// Reads a report descriptor. Throws InputError when it is damaged; what() says in a few words what is wrong, and at
-// which byte.
+// Parses a report descriptor. Throws InputError if it is damaged; what() briefly names the problem and its offset.
 HidReportDescriptor parseHidReportDescriptor(std::span<const std::uint8_t> bytes);
 
 }  // namespace quazor

@@ -19,12 +19,12 @@ using ::testing::ElementsAre;
 using ::testing::IsEmpty;
 using ::testing::Pair;
 
-// An image sensor: input report 0x76 of 791 bytes behind its ID, feature reports 0xAB and 0xAC of one.
+// An image sensor: input report 0x76 of 791 bytes after its ID, feature reports 0xAB and 0xAC of one byte.
 const Bytes kSensor = {0x06, 0x00, 0xFF, 0x09, 0x24, 0xA1, 0x01, 0x15, 0x00, 0x26, 0xFF, 0x00, 0x75, 0x08,
                        0x85, 0x76, 0x09, 0x76, 0x96, 0x17, 0x03, 0x81, 0x02, 0x85, 0xAB, 0x09, 0xAB, 0x95,
                        0x01, 0xB1, 0x02, 0x85, 0xAC, 0x09, 0xAC, 0x95, 0x01, 0xB1, 0x02, 0xC0};
 
-// A mouse: three buttons, five bits of filling and two axes, without an ID.
+// A mouse without report IDs: three buttons, five bits of padding and two axes.
 const Bytes kMouse = {0x05, 0x01, 0x09, 0x02, 0xA1, 0x01, 0x09, 0x01, 0xA1, 0x00, 0x05, 0x09, 0x19,
                       0x01, 0x29, 0x03, 0x15, 0x00, 0x25, 0x01, 0x95, 0x03, 0x75, 0x01, 0x81, 0x02,
                       0x95, 0x01, 0x75, 0x05, 0x81, 0x01, 0x05, 0x01, 0x09, 0x30, 0x09, 0x31, 0x15,
@@ -32,7 +32,7 @@ const Bytes kMouse = {0x05, 0x01, 0x09, 0x02, 0xA1, 0x01, 0x09, 0x01, 0xA1, 0x00
 
 HidReportDescriptor parsed(const Bytes& bytes) { return parseHidReportDescriptor(bytes); }
 
-// Empty when it was read.
+// Empty if the descriptor is valid.
 std::string problemOf(const Bytes& bytes) {
   try {
     parseHidReportDescriptor(bytes);
@@ -105,7 +105,7 @@ TEST(HidReportDescriptorTest, FieldsOfOneReportAddUpAndBitsFillBytes) {
 }
 
 TEST(HidReportDescriptorTest, TheLargestReportThatFits) {
-  // 16384 times 8 bits.
+  // 16384 fields of 8 bits.
   const Bytes largest = {0xA1, 0x01, 0x75, 0x08, 0x96, 0x00, 0x40, 0x81, 0x02, 0xC0};
   EXPECT_THAT(parsed(largest).inputReports, ElementsAre(Pair(0, HidReportDescriptor::kMaxReport)));
 }
@@ -142,7 +142,7 @@ TEST(HidReportDescriptorTest, EveryBeginningOfADescriptorIsReadOrRefused) {
   std::vector<std::size_t> read;
   for (std::size_t length = 0; length <= kSensor.size(); ++length) {
     Bytes bytes(kSensor.begin(), kSensor.begin() + static_cast<std::ptrdiff_t>(length));
-    bytes.shrink_to_fit();  // nothing may be read behind it
+    bytes.shrink_to_fit();  // makes a read past the end detectable
     if (problemOf(bytes).empty()) read.push_back(length);
   }
   EXPECT_EQ(read, (std::vector<std::size_t>{0, 3, 5, kSensor.size()}))

@@ -1,5 +1,4 @@
-// HID devices without a kernel's, for the tests of this folder: files in place of sysfs, connected sockets in place of
-// hidraw nodes.
+// Fake HID devices for the tests of this folder: files replace sysfs, connected sockets replace hidraw nodes.
 #pragma once
 
 #include "backends/linux/hid/hidraw_calls.h"
@@ -26,7 +25,7 @@
 
 namespace quazor {
 
-// Input report 0x76 of `length` bytes with its ID, feature reports 0xAB and 0xAC of two, of the vendors' page 0xFF00.
+// Input report 0x76 of `length` bytes with its ID, feature reports 0xAB and 0xAC of two bytes, in vendor page 0xFF00.
 inline Bytes sensorDescriptor(std::uint16_t page, std::uint8_t usage, std::uint16_t length = 792) {
   const auto fields = static_cast<std::uint16_t>(length - 1);
   const auto low = [](std::uint16_t number) { return static_cast<std::uint8_t>(number); };
@@ -37,12 +36,12 @@ inline Bytes sensorDescriptor(std::uint16_t page, std::uint8_t usage, std::uint1
 }
 inline Bytes sensorDescriptor(std::uint8_t usage = 0x24) { return sensorDescriptor(0xFF00, usage); }
 
-// Two input bytes without an ID, and a feature report of one.
+// Two input bytes without an ID, and a feature report of one byte.
 inline Bytes unnumberedDescriptor() {
   return {0x06, 0x00, 0xFF, 0x09, 0x30, 0xA1, 0x01, 0x75, 0x08, 0x95, 0x02, 0x81, 0x02, 0x95, 0x01, 0xB1, 0x02, 0xC0};
 }
 
-// A tree like sysfs and one like /dev, which go with this object.
+// Directory trees that replace sysfs and /dev, removed at the end of this object's lifetime.
 class HidrawTree {
  public:
   HidrawTree() {
@@ -60,7 +59,7 @@ class HidrawTree {
   std::filesystem::path path(const std::string& node) const { return roots().devices / node; }
   std::filesystem::path classEntry(const std::string& node) const { return roots().sysfs / "class" / "hidraw" / node; }
 
-  // Connects a device under that node's name. The instance tells connections of it apart.
+  // Connects a device as that node. `instance` distinguishes repeated connections.
   void connect(const std::string& node, const Bytes& descriptor, const std::string& name = "Test Sensor",
                int instance = 1) {
     const std::filesystem::path device =
@@ -82,7 +81,7 @@ class HidrawTree {
   std::filesystem::path folder_;
 };
 
-// Two connected sockets that keep the bounds of what is sent, as a hidraw node does.
+// Two connected sockets that preserve message boundaries, like a hidraw node.
 inline std::pair<FileDescriptor, FileDescriptor> connectedSockets() {
   std::array<int, 2> ends{-1, -1};
   EXPECT_EQ(::socketpair(AF_UNIX, SOCK_SEQPACKET | SOCK_CLOEXEC | SOCK_NONBLOCK, 0, ends.data()), 0);
@@ -93,7 +92,7 @@ inline void sendReport(const FileDescriptor& device, const Bytes& report) {
   EXPECT_EQ(::send(device.get(), report.data(), report.size(), MSG_NOSIGNAL), static_cast<ssize_t>(report.size()));
 }
 
-// Hands out the near ends of connected sockets and keeps the far ones, which are the devices.
+// Returns one end of connected sockets and keeps the other, which represents the device.
 class FakeHidrawCalls final : public HidrawCalls {
  public:
   FileDescriptor open(const std::filesystem::path& path) override {
@@ -136,7 +135,7 @@ class FakeHidrawCalls final : public HidrawCalls {
   std::chrono::nanoseconds time{0};
   std::vector<std::string> opened;
   std::vector<Bytes> features;
-  FileDescriptor device;  // the far end of what was opened last
+  FileDescriptor device;  // the device's end of the last opened connection
 };
 
 }  // namespace quazor

@@ -20,7 +20,7 @@ void HidrawInput::close() {
   descriptor_.reset();
   for (auto& [place, watch] : std::exchange(watches_, {})) {
     watch.reset();
-    // On another thread than this the loop may sleep, and keeps the descriptor open until it wakes.
+    // The loop of another thread may be sleeping, and keeps the descriptor open until it wakes.
     signal(*place);
   }
 }
@@ -45,12 +45,12 @@ void HidrawInput::onRoundBegan(const Place& place) {
   if (const auto found = watches_.find(&place); found != watches_.end()) found->second->arm();
 }
 
-// Has the loop wait for the descriptor. When this is not the loop's thread, its source does so there.
+// Makes the loop wait for the descriptor, or on another thread signals the source, which then does so.
 void HidrawInput::watchOrSignal(const Place& place) {
   if (!ended_ && !watch(place)) signal(place);
 }
 
-// False when this is no loop that can wait for descriptors, or not its thread.
+// False if the loop cannot wait for descriptors or belongs to another thread.
 bool HidrawInput::watch(const Place& place) {
   std::shared_ptr<DescriptorWatch> watch = watchDescriptor(*place.loop, descriptor_, place.source.lock());
   if (watch == nullptr) return false;
@@ -59,14 +59,14 @@ bool HidrawInput::watch(const Place& place) {
   return true;
 }
 
-// The kernel gives one report for each read, and drops what does not fit.
+// Each read returns one report; the kernel discards what does not fit.
 void HidrawInput::discardPending() const {
   std::array<std::uint8_t, 1> byte{};
   for (std::size_t i = 0; i < kMaxInARound && read(byte) > 0; ++i) {
   }
 }
 
-// A read that never waits can be interrupted nevertheless: hidraw looks for signals before it looks for reports.
+// Even a non-blocking read can be interrupted: hidraw checks for signals before it checks for reports.
 long HidrawInput::read(std::span<std::uint8_t> room) const {
   long size = -1;
   do {
@@ -94,7 +94,7 @@ std::shared_ptr<const HidInput> HidrawInput::next(const Place& place) {
       HidInput{Bytes(buffer.data(), buffer.data() + idBytes + static_cast<std::size_t>(size)), nullptr});
 }
 
-// What a read says that gave no report. A device that was removed gives what is kept, and then EIO.
+// The error for a read without a report. A removed device first returns its pending reports, then EIO.
 DiagnosticErrorPtr HidrawInput::endedBy(long size, int number) {
   ended_ = true;
   watches_.clear();

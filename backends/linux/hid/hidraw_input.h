@@ -1,4 +1,4 @@
-// HidrawInput: the inputs of a hidraw device for one of its users.
+// HidrawInput: reads the inputs of a hidraw device for one user.
 #pragma once
 
 #include "backends/hid/hid_input_delivery.h"
@@ -16,27 +16,27 @@
 
 namespace quazor {
 
-// The kernel keeps the reports (63 of them, then the newest are lost); the run loop of the user's thread waits for the
-// descriptor, and its source reads one report after the other and hands it on. No thread and no queue stand between.
-// What the kernel has kept while the device was scheduled nowhere is thrown away when it is scheduled. A loop that
-// cannot wait for descriptors (watchDescriptor) gets an error that says so in place of reports.
+// The kernel queues the reports (63 of them; after that it drops the newest). The run loop of the user's thread waits
+// for the descriptor, and its source reads and delivers one report after the other; there is no other thread and no
+// other queue. Reports that were queued while the device was not scheduled are discarded when it is scheduled. On a
+// loop that cannot wait for descriptors (watchDescriptor) the receiver gets an error instead of reports.
 //
 // Thread: as HidInputDelivery.
 class HidrawInput final : public HidInputDelivery {
  public:
-  // The kernel's largest report (HID_MAX_BUFFER_SIZE) with the byte of its ID.
+  // The kernel's maximum report size (HID_MAX_BUFFER_SIZE) plus the ID byte.
   static constexpr std::size_t kMaxLength = 16385;
 
-  // `calls` must not be null. `device` stands in messages. `numbered` says whether the device's reports begin with
-  // their ID; where they do not, a 0 is put before each.
+  // `calls` must not be null. `device` is its name in messages. `numbered` tells whether the device's reports begin
+  // with their ID; otherwise a 0 is prepended to each.
   HidrawInput(std::shared_ptr<HidrawCalls> calls, std::string device, bool numbered)
       : calls_(std::move(calls)), device_(std::move(device)), numbered_(numbered) {}
 
-  // From now on reports are read from `descriptor`, whose reads must not wait.
+  // Reads reports from `descriptor` from now on; its reads must not block.
   void open(std::shared_ptr<const FileDescriptor> descriptor);
-  // Lets go of the descriptor; loops that wait for it let go of it at once.
+  // Releases the descriptor; loops that wait for it release it at once.
   void close();
-  // What is open, or null.
+  // The open descriptor, or null.
   std::shared_ptr<const FileDescriptor> descriptor() const;
 
  private:
@@ -57,8 +57,8 @@ class HidrawInput final : public HidInputDelivery {
   const bool numbered_;
 
   std::shared_ptr<const FileDescriptor> descriptor_;
-  bool ended_ = false;  // the user was told that nothing comes any more, since the device was opened
-  // While the device is open, since the loop's own thread first came to the place; none for loops that cannot wait.
+  bool ended_ = false;  // the user was informed of the end of input since the device was opened
+  // The watches of an open device, created on the loop's own thread. Loops that cannot wait for descriptors have none.
   std::map<const Place*, std::shared_ptr<DescriptorWatch>> watches_;
 };
 

@@ -34,8 +34,8 @@ using ::testing::SizeIs;
 constexpr std::string_view kOther = "org.quazor.other";
 constexpr const char* kGone = "LinuxErrorDomain code 9: /dev/hidraw0 has been removed.";
 
-// An input on the loop of this thread. Reports are told as "0x76: 7601, 2 bytes" by their first bytes, errors as their
-// text.
+// An input on the loop of this thread. Reports are recorded as "0x76: 7601, 2 bytes", with their first bytes, errors as
+// their text.
 class HidrawInputTest : public ::testing::Test {
  protected:
   HidrawInputTest() { make(true); }
@@ -182,7 +182,7 @@ TEST_F(HidrawInputTest, ADeadDeviceDoesNotKeepTheLoopAwake) {
 }
 
 TEST_F(HidrawInputTest, AReadThatFailsOtherwiseIsToldWithTheSystemsError) {
-  // A directory can be opened and not read.
+  // A directory can be opened but not read.
   input_->open(std::make_shared<const FileDescriptor>(::open("/", O_RDONLY | O_DIRECTORY | O_CLOEXEC)));
   schedule();
   run();
@@ -192,7 +192,7 @@ TEST_F(HidrawInputTest, AReadThatFailsOtherwiseIsToldWithTheSystemsError) {
 TEST_F(HidrawInputTest, EveryErrorOfAReadEndsTheReportsOnceButForThoseThatSayNothing) {
   const struct {
     int number;
-    std::vector<std::string> seen;  // of a run with two reports, the first read of which gives the error
+    std::vector<std::string> seen;  // of a run with two reports whose first read fails
   } kRows[] = {
       {EINTR, {"7601, 2", "7602, 2"}},
       {EAGAIN, {"7601, 2", "7602, 2"}},
@@ -285,7 +285,7 @@ TEST_F(HidrawInputTest, TheReceiverMayEndItAllInItsOwnCall) {
   const struct {
     const char* name;
     std::function<void()> act;
-    RunLoopResult result;  // of a run after that
+    RunLoopResult result;  // of a later run
   } kRows[] = {
       {"unscheduling", [this] { unschedule(); }, RunLoopResult::kFinished},
       {"closing", [this] { input_->close(); }, RunLoopResult::kTimedOut},

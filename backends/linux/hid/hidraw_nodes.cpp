@@ -41,7 +41,7 @@ std::optional<Bytes> contentOf(const fs::path& file) {
   for (std::array<char, 4096> part; stream.read(part.data(), part.size()), stream.gcount() > 0;) {
     content.insert(content.end(), part.begin(), part.begin() + stream.gcount());
   }
-  // A device that is removed meanwhile makes a read fail.
+  // Reading fails if the device is removed in the meantime.
   return stream.bad() ? std::nullopt : std::optional(std::move(content));
 }
 

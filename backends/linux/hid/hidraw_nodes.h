@@ -10,28 +10,28 @@
 
 namespace quazor {
 
-// Where the kernel shows its devices; others than these in tests.
+// The directories of the kernel's devices; tests use their own.
 struct HidrawRoots {
   std::filesystem::path sysfs = "/sys";
   std::filesystem::path devices = "/dev";
 };
 
-// One hidraw device, without it being opened.
+// A hidraw device, found without opening it.
 struct HidrawNode {
-  std::filesystem::path path;    // as "/dev/hidraw0"; the number changes from one connection of the device to the next
-  std::string name;              // what the device calls itself; empty when the kernel does not say
+  std::filesystem::path path;    // for example "/dev/hidraw0"; the number changes when the device is reconnected
+  std::string name;              // the name that the device reports; empty if unknown
   std::filesystem::path device;  // its directory in sysfs, which changes when the device is reconnected
   Bytes rawDescriptor;
-  HidReportDescriptor descriptor;  // empty when there is a problem
-  std::string problem;             // why its report descriptor says nothing; empty when it does
-  std::string noAccess;            // why this user cannot open it; empty when he can
+  HidReportDescriptor descriptor;  // empty if there is a problem
+  std::string problem;             // why the report descriptor is invalid; empty if it is valid
+  std::string noAccess;            // why this user cannot open it; empty if possible
 };
 
-// Whether the kernel has the hidraw facility at all.
+// True if the kernel supports hidraw.
 bool hasHidraw(const HidrawRoots& roots = {});
-// All of them, in the order of their numbers. What goes away meanwhile is left out.
+// All of them, sorted by number. Skips devices that are removed in the meantime.
 std::vector<HidrawNode> hidrawNodes(const HidrawRoots& roots = {});
-// The directory in sysfs of the device that now has that path; empty when there is none.
+// The directory in sysfs of the device that currently has that path; empty if there is none.
 std::filesystem::path hidrawDevice(const HidrawRoots& roots, const std::filesystem::path& path);
 
 }  // namespace quazor

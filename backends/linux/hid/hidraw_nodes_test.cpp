@@ -89,7 +89,7 @@ TEST_F(HidrawNodesTest, ADescriptorThatCannotBeReadIsThatOfADeviceThatGoesAway) 
   tree_.connect("hidraw1", sensorDescriptor());
   const std::filesystem::path file = tree_.classEntry("hidraw0") / "device" / "report_descriptor";
   std::filesystem::remove(file);
-  std::filesystem::create_directory(file);  // can be opened, and every read fails
+  std::filesystem::create_directory(file);  // it can be opened, but reads fail
   EXPECT_THAT(paths(), ElementsAre("hidraw1"));
 }
 

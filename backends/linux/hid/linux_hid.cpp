@@ -27,14 +27,14 @@ class KernelCalls final : public HidrawCalls {
     return ::read(descriptor, room.data(), room.size());
   }
   int setFeature(int descriptor, std::span<const std::uint8_t> report) override {
-    // The request's number holds the length; the kernel takes the bytes as its own to change.
+    // The request number contains the length. The kernel may modify the bytes, so it gets a copy.
     std::vector<std::uint8_t> bytes(report.begin(), report.end());
     return ::ioctl(descriptor, HIDIOCSFEATURE(bytes.size()), bytes.data());
   }
   std::chrono::nanoseconds now() override { return std::chrono::steady_clock::now().time_since_epoch(); }
 };
 
-// Bits of a request's number are left for the length.
+// The request number has a limited number of bits for the length.
 constexpr std::size_t kMaxFeatureLength = (std::size_t{1} << _IOC_SIZEBITS) - 1;
 
 std::optional<HidUsage> primaryUsage(const HidrawNode& node) {
@@ -55,7 +55,7 @@ class LinuxHidDevice final : public HidDevice {
   std::string ownName() const { return node_.name.empty() ? name() : node_.name; }
 
   bool open(DiagnosticErrorPtr* error) override {
-    if (input_->descriptor() != nullptr) return refuse(error, LinuxErrorCode::kWrongState, "is open already");
+    if (input_->descriptor() != nullptr) return refuse(error, LinuxErrorCode::kWrongState, "is already open");
     FileDescriptor descriptor = calls_->open(node_.path);
     if (!descriptor) {
       const int number = errno;
@@ -63,7 +63,7 @@ class LinuxHidDevice final : public HidDevice {
       failSystemCall(error, "open", name(), number);
       return false;
     }
-    // The path may now belong to another device.
+    // The path may belong to another device by now.
     const std::filesystem::path opened = hidrawDevice(roots_, node_.path);
     if (opened.empty()) return refuse(error, LinuxErrorCode::kDeviceGone, "has been removed");
     if (opened != node_.device) {
@@ -81,14 +81,14 @@ class LinuxHidDevice final : public HidDevice {
     if (descriptor == nullptr) return refuse(error, LinuxErrorCode::kWrongState, "is not open");
     if (payload.empty() || payload.front() != reportID || payload.size() > kMaxFeatureLength) {
       return refuse(error, LinuxErrorCode::kBadValue,
-                    "takes feature reports that begin with their ID and have at most " +
+                    "accepts feature reports that begin with their ID and have at most " +
                         std::to_string(kMaxFeatureLength) + " bytes");
     }
     const std::chrono::nanoseconds begin = calls_->now();
     int sent = -1;
     do {
       sent = calls_->setFeature(descriptor->get(), payload);
-    } while (sent < 0 && errno == EINTR);  // a signal is no answer
+    } while (sent < 0 && errno == EINTR);  // a signal does not end the request
     if (sent >= 0) return true;
     tellFailedFeature(reportID, errno, calls_->now() - begin, error);
     return false;
@@ -106,7 +106,7 @@ class LinuxHidDevice final : public HidDevice {
     return false;
   }
 
-  // EIO is the answer of a device that refuses, and, after a while, that of the kernel for one that does not answer.
+  // EIO means that the device refused or, after several seconds, that it did not respond.
   void tellFailedFeature(std::uint8_t reportID, int number, std::chrono::nanoseconds time,
                          DiagnosticErrorPtr* error) const {
     const std::string call = "HIDIOCSFEATURE of report " + std::to_string(reportID);
@@ -116,7 +116,7 @@ class LinuxHidDevice final : public HidDevice {
     }
     const auto waited = std::chrono::floor<std::chrono::milliseconds>(time).count();
     failLinux(error, LinuxErrorCode::kNoAnswer,
-              call + " on " + name() + " failed: the device did not answer for " + std::to_string(waited) + " ms.");
+              call + " on " + name() + " failed: the device did not respond for " + std::to_string(waited) + " ms.");
   }
 
   const HidrawNode node_;

@@ -11,26 +11,26 @@
 
 namespace quazor {
 
-// A device that does not answer a feature report makes the kernel wait for five seconds. A call that failed after at
-// least this time is told as LinuxErrorCode::kNoAnswer.
+// The kernel waits five seconds for a device that does not respond to a feature report. A call that fails after at
+// least this time is reported as LinuxErrorCode::kNoAnswer.
 inline constexpr std::chrono::milliseconds kHidAnswerTime{4500};
 
-// All hidraw devices of this machine. A device's usage page and usage are those of the first top-level collection of
-// its report descriptor. Each enumeration scans again and creates new objects.
+// All hidraw devices of this machine. The usage page and usage of a device are those of the first top-level collection
+// in its report descriptor. Each enumeration scans again and creates new objects.
 //
-// There is no manager when the kernel has no hidraw. Devices that this user may not use are found too; they say so when
-// they are opened. Input reports and payloads of feature reports begin with the byte of their ID, which is 0 where a
-// device has no IDs. Reports are handed on as long or as short as they come. A device is scheduled on run loops of
-// makeLinuxRunLoops(); on any other its receiver gets an error, once.
+// There is no manager if the kernel has no hidraw. Enumeration includes devices that this user may not open; opening
+// them fails. Input reports and payloads of feature reports begin with their ID byte, which is 0 if a device has no
+// IDs. Reports are passed on with their actual length. A device can be scheduled on run loops of makeLinuxRunLoops();
+// on any other the receiver gets one error.
 std::shared_ptr<HidService> makeLinuxHid();
-// The same with another kernel. `calls` must not be null.
+// The same with replaced system calls. `calls` must not be null.
 std::shared_ptr<HidService> makeLinuxHid(HidrawRoots roots, std::shared_ptr<HidrawCalls> calls);
 
-// What a device of this service calls itself, as "Acme Sensor"; its path where it says nothing, and empty for a device
-// that is none of this service. Any thread.
+// The name that a device of this service reports, for example "Acme Sensor"; its path if it reports none, and empty if
+// the device does not belong to this service. Thread: any.
 std::string linuxHidName(const HidDevice& device);
 
-// The kernel's own calls.
+// The system's own calls.
 std::shared_ptr<HidrawCalls> makeHidrawCalls();
 
 }  // namespace quazor

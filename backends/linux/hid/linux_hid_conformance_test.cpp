@@ -15,7 +15,7 @@
 namespace quazor {
 namespace {
 
-// Sockets in place of hidraw devices.
+// Sockets replace hidraw devices.
 class LinuxHidUnderTest {
  public:
   void connect(const std::vector<ConformanceDevice>& devices, std::map<int, ConformanceEvent> events) {
@@ -43,7 +43,7 @@ class LinuxHidUnderTest {
       sendReport(calls_->device, {0x76, 0, 0, 0, static_cast<std::uint8_t>(arrived_), 0, 0, 0});
     } else if (event->second == ConformanceEvent::kError) {
       calls_->readErrors = {EFAULT};
-      sendReport(calls_->device, {0x76});  // wakes whoever waits; the read fails
+      sendReport(calls_->device, {0x76});  // wakes the waiting loop; the read fails
     } else {
       calls_->device.reset();
       calls_->featureError = ENODEV;

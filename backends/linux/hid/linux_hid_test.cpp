@@ -36,7 +36,7 @@ class LinuxHidTest : public ::testing::Test {
     made->enumerateDevicesMatching(matching);
     return made->devices();
   }
-  // The names of the nodes that one of the dictionaries matches.
+  // The names of the nodes that match one of the dictionaries.
   std::vector<std::string> found(const std::vector<Dictionary>& matching) {
     std::vector<std::string> names;
     for (const auto& device : find(matching)) {
@@ -49,7 +49,7 @@ class LinuxHidTest : public ::testing::Test {
     tree_.connect("hidraw0", sensorDescriptor());
     return find().at(0);
   }
-  // With the folder of this run's devices as "/dev".
+  // The text of the error, with "/dev" for the directory of this test's devices.
   std::string textOf(const DiagnosticErrorPtr& error) const {
     std::string text = defaultText(error);
     const std::string folder = tree_.roots().devices;
@@ -130,7 +130,7 @@ TEST_F(LinuxHidTest, ThisMachinesServiceAnswers) {
 TEST_F(LinuxHidTest, ADeviceOpensOnceUntilItIsClosed) {
   const std::shared_ptr<HidDevice> device = sensor();
   EXPECT_TRUE(device->open(nullptr));
-  EXPECT_EQ(errorOfOpen(*device), "LinuxErrorDomain code 7: /dev/hidraw0 is open already.");
+  EXPECT_EQ(errorOfOpen(*device), "LinuxErrorDomain code 7: /dev/hidraw0 is already open.");
   device->close(0);
   device->close(0);
   EXPECT_TRUE(device->open(nullptr));
@@ -194,7 +194,7 @@ TEST_F(LinuxHidTest, FeatureReportsReachTheDeviceWhole) {
   EXPECT_TRUE(device->setFeatureReportWithID(0, Bytes{0, 7}, nullptr));
   EXPECT_THAT(calls_->features, ElementsAre(Bytes{0xAB, 1}, Bytes{0, 7}));
   const std::string refusal =
-      "LinuxErrorDomain code 6: /dev/hidraw0 takes feature reports that begin with their ID and have at most 16383 "
+      "LinuxErrorDomain code 6: /dev/hidraw0 accepts feature reports that begin with their ID and have at most 16383 "
       "bytes.";
   EXPECT_EQ(errorOfFeature(*device, 0xAB, {}), refusal);
   EXPECT_EQ(errorOfFeature(*device, 0xAB, {0xAC, 1}), refusal);
@@ -217,10 +217,10 @@ TEST_F(LinuxHidTest, AFeatureReportThatFailsSaysWhy) {
       {"refused late", EIO, 4499ms,
        "LinuxErrorDomain code 1: HIDIOCSFEATURE of report 171 on /dev/hidraw0 failed: Input/output error (EIO)"},
       {"without an answer", EIO, 5120ms,
-       "LinuxErrorDomain code 11: HIDIOCSFEATURE of report 171 on /dev/hidraw0 failed: the device did not answer for "
+       "LinuxErrorDomain code 11: HIDIOCSFEATURE of report 171 on /dev/hidraw0 failed: the device did not respond for "
        "5120 ms."},
       {"without an answer from USB", ETIMEDOUT, 1s,
-       "LinuxErrorDomain code 11: HIDIOCSFEATURE of report 171 on /dev/hidraw0 failed: the device did not answer for "
+       "LinuxErrorDomain code 11: HIDIOCSFEATURE of report 171 on /dev/hidraw0 failed: the device did not respond for "
        "1000 ms."},
       {"gone", ENODEV, 5s,
        "LinuxErrorDomain code 9: HIDIOCSFEATURE of report 171 on /dev/hidraw0 failed: No such device (ENODEV)"},
@@ -273,7 +273,7 @@ TEST_F(LinuxHidTest, ADeviceThatIsDroppedWhileItIsScheduledLeavesItsLoop) {
   EXPECT_EQ(loop.runInMode(kRunLoopDefaultMode, 10s, false), RunLoopResult::kFinished);
 }
 
-// The kernel's own calls, on files that are no HID devices.
+// The system's own calls, on files that are not HID devices.
 TEST(HidrawCallsTest, TheyAskTheSystem) {
   const std::shared_ptr<HidrawCalls> calls = makeHidrawCalls();
   EXPECT_FALSE(calls->open("/no/such/device"));

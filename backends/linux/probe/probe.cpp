@@ -18,7 +18,7 @@ namespace {
 
 using Json = nlohmann::ordered_json;
 
-// What many machines count, as entries of a binding.
+// Counters that many machines have, as entries of a binding.
 std::vector<CounterFilesBinding> usualCounterFiles() {
   return {
       {"/sys/fs/cgroup/{group}/{subgroup}/{name}/cpu.stat", std::nullopt, std::nullopt, std::nullopt, "usage_usec"},
@@ -54,7 +54,7 @@ class Probe {
     tell("Counters");
     probeCounterFiles();
     probeTracepoints();
-    // A name may hold any bytes; those that are no text become marks of that.
+    // Names may contain arbitrary bytes; invalid UTF-8 is replaced.
     return {std::move(lines_), binding_.dump(2, ' ', false, Json::error_handler_t::replace) + "\n"};
   }
 
@@ -148,7 +148,7 @@ class Probe {
     binding_["tracepoints"] = {{{"system", "v4l2"}, {"event", "v4l2_dqbuf"}}};
   }
 
-  // The channels of a binding; tells how many there are, or why one may not look.
+  // The channels of a binding; reports their number, or the missing permission.
   std::vector<CounterChannel> channelsOf(const Binding& binding, const std::string& what) {
     DiagnosticErrorPtr error;
     std::optional<std::vector<CounterChannel>> channels = counterChannels(binding, *sources_.counters, &error);

@@ -1,4 +1,4 @@
-// What this machine has that a binding can name.
+// Finds the devices of this machine that a binding can name.
 #pragma once
 
 #include "backends/linux/counters/counter_system.h"
@@ -13,26 +13,26 @@
 
 namespace quazor {
 
-// Where to look.
+// Where to search.
 struct ProbeSources {
   std::shared_ptr<V4l2Api> kernel;
   DeviceRoots devices;
   HidrawRoots hid;
   std::shared_ptr<CounterSystem> counters;
-  std::filesystem::path sysfs;  // of the displays
+  std::filesystem::path sysfs;  // for the displays
 };
 ProbeSources sourcesOfRunningSystem();
 
 struct MachineProbe {
-  // For people, line by line: cameras, HID devices, displays and counters; why each fits or not; what to do about it.
-  // May hold any character that a device gives.
+  // User-readable lines about cameras, HID devices, displays and counters: whether each fits, why, and what to do. They
+  // may contain any character that a device reports.
   std::vector<std::string> lines;
-  // A binding of all that fits, as the text of a file that readBinding() takes.
+  // A binding for everything that fits, as text that readBinding() accepts.
   std::string binding;
 };
 
-// Opens each video node for a moment, which disturbs no stream, and no other device. Never fails: what cannot be looked
-// at is told.
+// Opens each video node briefly, which does not disturb streams, and no other device. Never fails: the lines include
+// what cannot be examined.
 MachineProbe probeMachine(const ProbeSources& sources);
 
 }  // namespace quazor

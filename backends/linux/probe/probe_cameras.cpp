@@ -19,11 +19,11 @@ constexpr std::array kPorts{port_type::BackFacingCamera, port_type::BackFacingTe
                             port_type::BackFacingSuperWideCamera, port_type::FrontFacingCamera,
                             port_type::FrontFacingInfraredCamera};
 constexpr double kDefaultRate = 30;
-// What is chosen of a camera that offers any size, and the most that is chosen of others.
+// The size for a camera that supports any size, and the maximum for others.
 constexpr std::uint32_t kDefaultWidth = 640;
 constexpr std::uint32_t kDefaultHeight = 480;
 constexpr std::uint64_t kMaxPixels = std::uint64_t{1920} * 1080;
-constexpr std::uint32_t kMaxSide = 65536;  // that a binding can name
+constexpr std::uint32_t kMaxSide = 65536;  // the maximum of a binding
 
 bool reachesUsualRate(const FrameSize& size) {
   bool below = false;
@@ -51,8 +51,8 @@ std::string ratesText(const FrameSize& size) {
 
 std::string sizeText(const FrameSize& size) {
   std::string text = formatMessage("%@x%@", size.width, size.height);
-  if (size.highestWidth > size.width || size.highestHeight > size.height) {
-    text += formatMessage(" to %@x%@", size.highestWidth, size.highestHeight);
+  if (size.maximumWidth > size.width || size.maximumHeight > size.height) {
+    text += formatMessage(" to %@x%@", size.maximumWidth, size.maximumHeight);
   }
   return text + " at " + ratesText(size);
 }
@@ -63,16 +63,16 @@ std::vector<std::string> sizeTexts(const VideoFormat& format) {
   return texts;
 }
 
-// Formats that follow each other and have the same sizes are told together.
+// Consecutive formats with equal sizes share one line.
 void tellFormats(const std::vector<VideoFormat>& formats, std::vector<std::string>* lines) {
   for (std::size_t begin = 0; begin < formats.size();) {
     const std::vector<std::string> sizes = sizeTexts(formats[begin]);
     std::size_t end = begin;
     std::string codes;
-    for (; end < formats.size() && sizeTexts(formats[end]) == sizes; ++end) codes += " " + formats[end].code;
+    for (; end < formats.size() && sizeTexts(formats[end]) == sizes; ++end) codes += " " + formats[end].fourcc;
     lines->push_back(
         end - begin == 1
-            ? formatMessage("    format %@:%@ (%@)", formats[begin].index, codes, formats[begin].text)
+            ? formatMessage("    format %@:%@ (%@)", formats[begin].index, codes, formats[begin].description)
             : formatMessage("    formats %@ to %@:%@", formats[begin].index, formats[end - 1].index, codes));
     for (const std::string& size : sizes) lines->push_back("      " + size);
     begin = end;
@@ -85,14 +85,14 @@ void tellControls(const std::vector<VideoControl>& controls, std::vector<std::st
   if (!names.empty()) lines->push_back("    controls: " + names);
 }
 
-// The size that a binding begins with: the largest one at the usual rate, or the largest one.
+// The size for the starter binding: the largest one at the default rate, or the largest one.
 std::optional<std::pair<std::uint32_t, std::uint32_t>> chosenSize(const VideoNodeDetails& details) {
   std::optional<std::pair<std::uint32_t, std::uint32_t>> chosen;
   std::pair<bool, std::uint64_t> best;
   if (details.formats.empty()) return chosen;
   for (const FrameSize& size : details.formats.front().sizes) {
-    const std::uint32_t width = std::clamp(kDefaultWidth, size.width, std::max(size.width, size.highestWidth));
-    const std::uint32_t height = std::clamp(kDefaultHeight, size.height, std::max(size.height, size.highestHeight));
+    const std::uint32_t width = std::clamp(kDefaultWidth, size.width, std::max(size.width, size.maximumWidth));
+    const std::uint32_t height = std::clamp(kDefaultHeight, size.height, std::max(size.height, size.maximumHeight));
     if (std::min(width, height) == 0 || std::max(width, height) > kMaxSide) continue;
     const std::uint64_t pixels = std::uint64_t{width} * height;
     const std::pair<bool, std::uint64_t> worth{reachesUsualRate(size), pixels <= kMaxPixels ? pixels : 1};

@@ -1,4 +1,4 @@
-// The cameras among what a machine has.
+// Finds the cameras of a machine.
 #pragma once
 
 #include "backends/linux/video/v4l2_api.h"
@@ -12,8 +12,8 @@
 
 namespace quazor {
 
-// Adds lines about all video nodes (see MachineProbe), and gives the entry "cameras" of a binding: those that fit, by
-// the ports in their usual order.
+// Adds lines about all video nodes (see MachineProbe) and returns the entry "cameras" of a binding: the nodes that fit,
+// assigned to the ports in their default order.
 nlohmann::ordered_json probeCameras(const std::shared_ptr<V4l2Api>& kernel, const DeviceRoots& roots,
                                     std::vector<std::string>* lines);
 

@@ -39,7 +39,7 @@ class ProbeTest : public ::testing::Test {
     binding_ = readBinding(folder_ / "binding.json");
     return found;
   }
-  // The lines that the probe tells, without the folder of the made-up devices.
+  // The lines of the probe, without the directory of the fake devices.
   std::vector<std::string> lines() {
     std::vector<std::string> lines = probe().lines;
     const std::string dev = kernel_->roots().dev.string();
@@ -62,7 +62,7 @@ class ProbeTest : public ::testing::Test {
   const std::shared_ptr<FakeV4l2Api> kernel_ = std::make_shared<FakeV4l2Api>();
   const std::shared_ptr<FakeCounters> counters_ = std::make_shared<FakeCounters>();
   HidrawRoots hid_{folder_ / "no sysfs", folder_};
-  Binding binding_;  // what was suggested last
+  Binding binding_;  // the last suggestion
 };
 
 TEST_F(ProbeTest, TellsOfAMachineWithNothing) {
@@ -132,7 +132,7 @@ TEST_F(ProbeTest, ChoosesTheLargestSizeAtTheUsualRate) {
   };
   for (const auto& row : kRows) {
     FakeNode node = fakeCamera("fake:0");
-    node.formats = {{node.formats[0].code, "format", row.sizes}};
+    node.formats = {{node.formats[0].fourcc, "format", row.sizes}};
     kernel_->add(0, node);
     const std::vector<std::string> told = lines();
     ASSERT_EQ(binding_.cameras.size(), 1U) << row.what;
@@ -176,7 +176,7 @@ TEST_F(ProbeTest, BindsNoCameraThatABindingCannotName) {
   nameless.card.clear();
   kernel_->add(0, nameless);
   FakeNode absurd = fakeCamera("fake:1");
-  absurd.formats = {{absurd.formats[0].code, "format", {{0, 0, {{1, 30}}}, {70000, 1, {{1, 30}}}}}};
+  absurd.formats = {{absurd.formats[0].fourcc, "format", {{0, 0, {{1, 30}}}, {70000, 1, {{1, 30}}}}}};
   kernel_->add(1, absurd);
   const std::vector<std::string> told = lines();
   EXPECT_THAT(told, Contains(HasSubstr("reports nothing that a binding could use to identify it")));

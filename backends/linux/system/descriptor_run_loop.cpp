@@ -41,8 +41,8 @@ class OneShotWatch final : public DescriptorWatch {
 
 class DescriptorWaiter final : public RunLoopWaiter {
  public:
-  // False when there is nothing that another thread could wake this one by. A process that was made by fork would share
-  // the wake-ups of its parent, and so gets its own.
+  // False if there is no descriptor to wake this thread with. A forked process gets its own, because it would otherwise
+  // share the wake-ups of its parent.
   bool canBeWoken() {
     const pid_t process = ::getpid();
     if (!wakeUps_ || process != process_) wakeUps_ = FileDescriptor(::eventfd(0, EFD_CLOEXEC | EFD_NONBLOCK));
@@ -63,7 +63,7 @@ class DescriptorWaiter final : public RunLoopWaiter {
             ready, [this] { return now(); }, deadline))
       return;
     for (;;) {
-      // A thread that changes the condition and finds no sleeper did so before `ready` is called here.
+      // A thread that changes the condition without seeing a sleeper did so before the following call of `ready`.
       asleep_.store(true);
       if (ready()) break;
       const std::chrono::nanoseconds left = deadline == kNever ? kNever : deadline - now();
@@ -77,7 +77,7 @@ class DescriptorWaiter final : public RunLoopWaiter {
   void wake() override {
     if (!asleep_.load() || !asleep_.exchange(false)) return;
     const std::uint64_t one = 1;
-    // It can only fail where the thread is woken anyway: by a count that is as high as it can be.
+    // It can fail only if the count is at its maximum, and then the thread is woken anyway.
     [[maybe_unused]] const ssize_t written = ::write(wakeUps_.get(), &one, sizeof one);
   }
 
@@ -87,7 +87,7 @@ class DescriptorWaiter final : public RunLoopWaiter {
     return {static_cast<std::time_t>(seconds.count()), static_cast<long>((time - seconds).count())};
   }
 
-  // Keeps the watches that are to be told, and with them their descriptors, for as long as the system looks at them.
+  // Collects the armed watches and keeps their descriptors open during the system call.
   void gather() {
     std::erase_if(watches_, [](const std::weak_ptr<OneShotWatch>& watch) { return watch.expired(); });
     asked_ = {{wakeUps_.get(), POLLIN, 0}};
@@ -99,8 +99,8 @@ class DescriptorWaiter final : public RunLoopWaiter {
     }
   }
 
-  // Sleeps until something that was gathered is ready or the time is over, and signals the sources of what is ready.
-  // May return early.
+  // Blocks until a collected descriptor is ready or the time is over, and signals the sources of ready descriptors. May
+  // return early.
   void poll(std::chrono::nanoseconds longest) {
     const timespec timeout = timespecOf(longest);
     const int ready = ::ppoll(asked_.data(), asked_.size(), longest == kNever ? nullptr : &timeout, nullptr);
@@ -121,10 +121,10 @@ class DescriptorWaiter final : public RunLoopWaiter {
 
   Watch watch_;
   FileDescriptor wakeUps_;
-  pid_t process_ = 0;  // whose they are
+  pid_t process_ = 0;  // the process that owns wakeUps_
   std::atomic<bool> asleep_{false};
   std::vector<std::weak_ptr<OneShotWatch>> watches_;
-  // Of one call of ppoll: the wake-ups first, then what held_ has.
+  // The arguments of one call of ppoll: the wake-ups first, then the descriptors of held_.
   std::vector<pollfd> asked_;
   std::vector<std::shared_ptr<OneShotWatch>> held_;
 };

@@ -8,20 +8,20 @@
 
 namespace quazor {
 
-// Every thread has a loop, the same for all services that are made here. It is made when it is first asked for and
-// destroyed when the thread ends. A thread gets none when the process has no file descriptor left for it.
+// Every thread has one loop, shared by all services that are created here. It is created on first use and destroyed
+// when the thread ends. A thread gets none if the process has no file descriptor left for it.
 //
-// A signal and a stop take no lock, and make a system call only when the loop's thread sleeps. The thread sleeps in
-// ppoll(2), on the watched descriptors and on the one that signals wake it by; one that is woken often looks out for
-// a moment before it sleeps. In every round of a run, also of one whose limit is zero, it asks for the watched
-// descriptors without sleeping, so that no other source keeps it from them.
+// Signals and stops take no lock, and make a system call only if the loop's thread sleeps. The thread sleeps in
+// ppoll(2), on the watched descriptors and on one that wakes it; a thread that is woken frequently spins briefly before
+// it sleeps. Every round of a run, even with a limit of zero, polls the watched descriptors without blocking, so that
+// other sources cannot starve them.
 std::shared_ptr<RunLoops> makeLinuxRunLoops();
 
-// Has a descriptor looked at by a loop, until this object goes. Where several modes or several watches are concerned,
-// each watch tells for itself.
+// Watches a descriptor on a loop during the lifetime of this object. Several watches of one descriptor, or in several
+// modes, are independent.
 //
-// Thread: the loop's, but for the destructor, which any thread may run. A descriptor that goes with its watch on
-// another thread is closed when the loop's thread is awake the next time.
+// Thread: the loop's, except the destructor: any. If the destructor runs on another thread and releases the last
+// reference to the descriptor, the descriptor is closed when the loop's thread next wakes.
 class DescriptorWatch {
  public:
   DescriptorWatch() = default;
@@ -29,17 +29,18 @@ class DescriptorWatch {
   DescriptorWatch& operator=(const DescriptorWatch&) = delete;
   virtual ~DescriptorWatch() = default;
 
-  // Signals the source once, as soon as the descriptor can be read, has an error or is hung up. Nothing is told after
-  // that until this is called again, so a descriptor that stays ready does not keep the loop awake: the source's
-  // handler calls this unless it found the descriptor dead.
+  // Signals the source once, as soon as the descriptor is readable, has an error or is hung up. There are no further
+  // signals until the next call, so a descriptor that stays ready does not keep the loop awake: the handler of the
+  // source calls this again, unless the descriptor is unusable.
   virtual void arm() = 0;
 };
 
-// Watches `descriptor`, which must be open, for `source`, which is a source of `loop`. It is not armed yet. The watch
-// keeps the descriptor and not the source.
+// Watches `descriptor`, which must be open, for `source`, which must be a source of `loop`. The watch is not yet armed.
+// It owns the descriptor but not the source.
 //
-// Null when `loop` is not the loop that makeLinuxRunLoops() gives the calling thread: other loops cannot wait for
-// descriptors. (A loop takes sources on its own thread only, so this one comparison tells them all apart.)
+// Returns null if `loop` is not the loop that makeLinuxRunLoops() returns on the calling thread, because other loops
+// cannot wait for descriptors. (A loop accepts sources only on its own thread, so this comparison identifies all of
+// them.)
 std::shared_ptr<DescriptorWatch> watchDescriptor(RunLoop& loop, std::shared_ptr<const FileDescriptor> descriptor,
                                                  const std::shared_ptr<RunLoopSource>& source);
 

@@ -16,7 +16,7 @@ class DescriptorLoops {
 
 INSTANTIATE_TYPED_TEST_SUITE_P(Descriptors, RunLoopStress, DescriptorLoops);
 
-// Two threads send at random moments, each in its own way; nothing may be lost, and the loop may not hang.
+// Two threads send at random times, in different ways. Nothing may be lost, and the loop must not hang.
 TEST(DescriptorRunLoopStressTest, NeitherSignalsNorBytesAreLost) {
   const int rounds = std::getenv("QUAZOR_THOROUGH") != nullptr ? 500'000 : 20'000;
   RunLoop& loop = DescriptorLoops().loop();

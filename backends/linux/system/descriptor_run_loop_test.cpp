@@ -53,7 +53,7 @@ std::chrono::nanoseconds processorTimeOfThisThread() {
   return std::chrono::seconds(used.tv_sec) + std::chrono::nanoseconds(used.tv_nsec);
 }
 
-// Two connected sockets; one end is watched for a source that counts, and reads nothing unless it is told to.
+// Two connected sockets. One end is watched for a source that counts signals and reads only if it is told to.
 class DescriptorRunLoopTest : public ::testing::Test {
  protected:
   static constexpr std::string_view kMode = kRunLoopDefaultMode;
@@ -203,7 +203,7 @@ TEST_F(DescriptorRunLoopTest, AHangUpIsTold) {
   EXPECT_EQ(run(10s, true), RunLoopResult::kHandledSource);
 }
 
-// A handler that sees a dead descriptor does not arm again; the descriptor stays as it is.
+// A handler does not arm the watch of an unusable descriptor again, although the descriptor stays ready.
 TEST_F(DescriptorRunLoopTest, ADeadDescriptorDoesNotKeepTheLoopAwake) {
   watch_->arm();
   armsAgain_ = false;
@@ -320,7 +320,7 @@ TEST_F(DescriptorRunLoopTest, AThreadGetsNoLoopWithoutADescriptorForItAndOneLate
   }).join();
 }
 
-// What the kernel numbers the event descriptors of this process by.
+// The kernel's IDs of this process's event descriptors.
 std::set<std::string> eventDescriptors() {
   std::set<std::string> found;
   for (const auto& entry : std::filesystem::directory_iterator("/proc/self/fdinfo")) {

@@ -1,4 +1,4 @@
-// FileDescriptor: an open file of the system, closed by its owner's end.
+// FileDescriptor: owns and closes a file descriptor.
 #pragma once
 
 #include <unistd.h>
@@ -11,7 +11,7 @@ namespace quazor {
 class FileDescriptor {
  public:
   FileDescriptor() = default;
-  // Takes the descriptor; a negative one is none.
+  // Takes ownership; negative means none.
   explicit FileDescriptor(int descriptor) : descriptor_(descriptor) {}
   FileDescriptor(FileDescriptor&& other) noexcept : descriptor_(std::exchange(other.descriptor_, -1)) {}
   FileDescriptor& operator=(FileDescriptor&& other) noexcept {

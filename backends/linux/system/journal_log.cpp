@@ -19,7 +19,7 @@ namespace {
 
 constexpr timeval kMaxWait{0, 100'000};
 
-// A value with line breaks carries its length, as 64 bits, little-endian; any other ends at the line's end.
+// A value with line breaks is preceded by its length, 64 bits little-endian; any other value ends at the line end.
 void appendField(std::string& fields, std::string_view name, std::string_view value) {
   fields += name;
   if (value.find('\n') == std::string_view::npos) {
@@ -50,7 +50,7 @@ FileDescriptor openSocket() {
   return made;
 }
 
-// A file in memory that nobody can change any more; none when the system has no place for it.
+// A sealed file in memory; none if the system cannot create it.
 FileDescriptor sealedFile(const std::string& content) {
   FileDescriptor file(::memfd_create("quazor log line", MFD_CLOEXEC | MFD_ALLOW_SEALING));
   std::size_t written = 0;
@@ -85,7 +85,7 @@ void JournalLog::tellWhatWasDropped(std::string_view subsystem, std::string_view
 
 JournalLog::Outcome JournalLog::send(const std::string& fields, bool mayWait) const {
   const int flags = MSG_NOSIGNAL | (mayWait ? 0 : MSG_DONTWAIT);
-  iovec part{const_cast<char*>(fields.data()), fields.size()};  // is only read
+  iovec part{const_cast<char*>(fields.data()), fields.size()};  // sendmsg() only reads it
   msghdr message{};
   message.msg_iov = &part;
   message.msg_iovlen = 1;
@@ -94,7 +94,7 @@ JournalLog::Outcome JournalLog::send(const std::string& fields, bool mayWait) co
   return isTooLong ? sendAsFile(fields, flags) : outcome;
 }
 
-// What is too long for a datagram goes in a file, whose descriptor an empty one carries.
+// A message that exceeds a datagram is sent as a file, whose descriptor accompanies an empty datagram.
 JournalLog::Outcome JournalLog::sendAsFile(const std::string& fields, int flags) const {
   const FileDescriptor file = sealedFile(fields);
   if (!file) return Outcome::kRefused;
@@ -111,7 +111,7 @@ JournalLog::Outcome JournalLog::sendAsFile(const std::string& fields, int flags)
   return sendMessage(message, flags);
 }
 
-// kRefused, and errno, when there is no journal or it cannot take this.
+// Returns kRefused and sets errno if there is no journal or it cannot accept the message.
 JournalLog::Outcome JournalLog::sendMessage(msghdr& message, int flags) const {
   sockaddr_un address{};
   address.sun_family = AF_UNIX;
@@ -126,7 +126,7 @@ JournalLog::Outcome JournalLog::sendMessage(msghdr& message, int flags) const {
   do {
     sent = ::sendmsg(socket_.get(), &message, flags);
   } while (sent < 0 && errno == EINTR);
-  message.msg_name = nullptr;  // it ends here
+  message.msg_name = nullptr;  // `address` goes out of scope
   if (sent >= 0) return Outcome::kTaken;
   return errno == EAGAIN ? Outcome::kDropped : Outcome::kRefused;
 }

@@ -1,4 +1,4 @@
-// JournalLog: log lines for the system's journal.
+// JournalLog: writes to the systemd journal.
 #pragma once
 
 #include "backends/linux/system/file_descriptor.h"
@@ -14,24 +14,23 @@
 
 namespace quazor {
 
-// Sends each line to the system's journal by its own protocol (https://systemd.io/JOURNAL_NATIVE_PROTOCOL/), with the
-// fields MESSAGE, PRIORITY (a level of syslog(3)), SYSLOG_IDENTIFIER ("quazor"), SUBSYSTEM and CATEGORY. Texts go as
-// they are: of any length, with line breaks, and also bytes that are no UTF-8, which journalctl shows with --all only.
+// Sends each line to the journal with its native protocol (https://systemd.io/JOURNAL_NATIVE_PROTOCOL/) and the fields
+// MESSAGE, PRIORITY (a syslog(3) level), SYSLOG_IDENTIFIER ("quazor"), SUBSYSTEM and CATEGORY. Texts are sent
+// unchanged: of any length, with line breaks, and with invalid UTF-8, which journalctl shows only with --all.
 //
-// libsystemd's sd_journal_sendv() is not used because, measured with version 252, it blocks for as long as a journal
-// does not read and returns success where there is no journal, so that lines could neither be dropped nor go to the
-// fallback.
+// libsystemd's sd_journal_sendv() is not used because, measured with version 252, it blocks while a journal does not
+// read and reports success if there is no journal, so lines could neither be dropped nor go to the fallback.
 //
-// Each line tries to connect again, so a restarted journal is found. A journal that has stopped reading costs one
-// line a tenth of a second; from then on lines that it does not take at once are dropped, and their number is told
-// when it takes lines again.
+// Each line is sent without a lasting connection, so a restarted journal is found. A journal that has stopped reading
+// delays one line by a tenth of a second. After that, lines that it does not accept at once are dropped, and their
+// number is logged when it accepts lines again.
 // Thread: any.
 class JournalLog final : public LogBackend {
  public:
   static constexpr std::string_view kSocket = "/run/systemd/journal/socket";
 
-  // `fallback` gets the lines for which there is no journal, or none that takes them; it must not be null. `socketPath`
-  // is where the journal listens; one of more than 107 bytes is that of no socket.
+  // `fallback` receives the lines if there is no journal or it refuses them; it must not be null. `socketPath` is the
+  // journal's socket; a path of more than 107 bytes is never one.
   explicit JournalLog(std::shared_ptr<LogBackend> fallback, std::string_view socketPath = kSocket);
 
   void write(LogLevel level, std::string_view subsystem, std::string_view category, std::string_view text) override;
@@ -46,8 +45,8 @@ class JournalLog final : public LogBackend {
 
   const std::shared_ptr<LogBackend> fallback_;
   const std::string socketPath_;
-  const FileDescriptor socket_;            // none when the system refused one
-  std::atomic<std::uint64_t> dropped_{0};  // lines, since the journal took one
+  const FileDescriptor socket_;            // none if the system refused one
+  std::atomic<std::uint64_t> dropped_{0};  // the number of lines since the journal last accepted one
 };
 
 }  // namespace quazor

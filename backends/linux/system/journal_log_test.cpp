@@ -37,7 +37,7 @@ using ::testing::StartsWith;
 
 constexpr int kSeals = F_SEAL_SEAL | F_SEAL_SHRINK | F_SEAL_GROW | F_SEAL_WRITE;
 
-// Listens where it is told, as the journal does.
+// Listens on a given path, like the journal.
 class FakeJournal {
  public:
   explicit FakeJournal(const std::string& path, int type = SOCK_DGRAM)
@@ -49,7 +49,7 @@ class FakeJournal {
   FakeJournal& operator=(const FakeJournal&) = delete;
   ~FakeJournal() { std::filesystem::remove(path_); }
 
-  // The fields of the next line, and whether they came in a file; nothing when there is no line.
+  // The fields of the next line, marked if they came in a file; nothing if there is no line.
   std::optional<std::string> receive() {
     std::string datagram(300'000, '\0');
     iovec part{datagram.data(), datagram.size()};
@@ -72,7 +72,7 @@ class FakeJournal {
     return contentOf(FileDescriptor(descriptor));
   }
 
-  // Takes as many lines as the queue holds; returns their number.
+  // Fills the queue and returns the number of lines that it holds.
   int fill() const {
     const FileDescriptor sender(::socket(AF_UNIX, SOCK_DGRAM | SOCK_CLOEXEC, 0));
     const sockaddr_un to = address();
@@ -131,7 +131,7 @@ class JournalLogTest : public ::testing::Test {
   const std::shared_ptr<RecordingLog> fallback_ = std::make_shared<RecordingLog>();
 };
 
-// The fields behind the text of a line that is written with LogLevel::kError, "s" and "c".
+// The fields after the text of a line that is written with LogLevel::kError, "s" and "c".
 constexpr std::string_view kRest = "PRIORITY=3\nSYSLOG_IDENTIFIER=quazor\nSUBSYSTEM=s\nCATEGORY=c\n";
 
 TEST_F(JournalLogTest, ALineIsOneDatagramWithItsFields) {
@@ -199,7 +199,7 @@ TEST_F(JournalLogTest, LineBreaksInTheOtherFieldsMakeNoFieldsEither) {
 TEST_F(JournalLogTest, WhatIsTooLongForADatagramArrivesInASealedFile) {
   startJournal();
   JournalLog log(fallback_, path_);
-  const std::string text = std::string(5'000'000, 'a') + "z";  // more than a socket may be given room for
+  const std::string text = std::string(5'000'000, 'a') + "z";  // exceeds the maximum buffer size of a socket
   log.write(LogLevel::kError, "s", "c", text);
   const std::string fields = received();
   EXPECT_TRUE(journal_->cameInAFile);
@@ -210,7 +210,7 @@ TEST_F(JournalLogTest, WhatIsTooLongForADatagramArrivesInASealedFile) {
   EXPECT_THAT(textsOfFallback(), IsEmpty());
 }
 
-// Lowers what this process may have of something, until this object goes.
+// Lowers a resource limit of this process during its lifetime.
 class Limit {
  public:
   Limit(__rlimit_resource_t resource, rlim_t most) : resource_(resource) {
@@ -348,7 +348,7 @@ TEST_F(JournalLogTest, LinesOfSeveralThreadsArriveWhole) {
   other.join();
   const std::string expected[] = {"MESSAGE\n\x0A\0\0\0\0\0\0\0one\nof two\n"s + rest, "MESSAGE=other\n" + rest};
   for (const std::string& line : expected) EXPECT_GT(lines[line], 0);
-  // On a machine that is very busy the queue may have been full for as long as is waited.
+  // On a very busy machine the queue may have stayed full for the whole wait.
   for (const auto& [line, times] : lines) {
     EXPECT_TRUE(line == expected[0] || line == expected[1] || line.starts_with("MESSAGE=the journal did not take"))
         << line;

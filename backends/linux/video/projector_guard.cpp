@@ -23,7 +23,7 @@
 namespace quazor {
 namespace {
 
-// Closes every descriptor but those.
+// Closes every other descriptor.
 void closeAllBut(const GuardDescriptors& kept) {
   std::array<int, 3> numbers{kept.connection, kept.guarded, kept.device};
   std::ranges::sort(numbers);
@@ -36,7 +36,7 @@ void closeAllBut(const GuardDescriptors& kept) {
   ::syscall(SYS_close_range, first, ~0U, 0U);
 }
 
-// In the new process; it is ready when it says so.
+// Runs in the new process; sends a byte when it is ready.
 [[noreturn]] void becomeGuard(const GuardDescriptors& descriptors, const std::vector<ControlValue>& values,
                               ControlSetter set) {
   ::setsid();
@@ -52,7 +52,7 @@ class ProjectorGuard final : public ControlGuard {
  public:
   ProjectorGuard(pid_t process, FileDescriptor connection) : process_(process), connection_(std::move(connection)) {}
   ~ProjectorGuard() override {
-    // A copy of this process may have the connection open too, so that closing it would not be noticed.
+    // A forked copy of this process may also hold the connection, so closing it is not enough.
     const char end = 0;
     ::send(connection_.get(), &end, 1, MSG_NOSIGNAL);
     while (::waitpid(process_, nullptr, 0) < 0 && errno == EINTR) continue;
@@ -100,7 +100,7 @@ std::unique_ptr<ControlGuard> startProjectorGuard(const std::string& path, const
   FileDescriptor ours(ends[0]);
   FileDescriptor theirs(ends[1]);
 
-  // The guard is born with all signals blocked: one that came before it could block them would end it.
+  // Blocks all signals before the fork: the guard must not receive one before it blocks them itself.
   sigset_t all;
   sigset_t before;
   sigfillset(&all);
@@ -111,14 +111,14 @@ std::unique_ptr<ControlGuard> startProjectorGuard(const std::string& path, const
   ::pthread_sigmask(SIG_SETMASK, &before, nullptr);
   if (process < 0) return nullptr;
 
-  // Until the guard has closed what it inherited, it keeps our devices open.
+  // Waits for the guard to close the descriptors that it inherited, which keep our devices open.
   theirs.reset();
   char ready = 0;
   ssize_t said = -1;
   while ((said = ::read(ours.get(), &ready, 1)) < 0 && errno == EINTR) continue;
   auto guard = std::make_unique<ProjectorGuard>(process, std::move(ours));
   if (said == 1) return guard;
-  *number = ECHILD;  // it was ended before it was ready
+  *number = ECHILD;  // the guard ended before it was ready
   return nullptr;
 }
 

@@ -24,7 +24,7 @@ namespace {
 
 using namespace std::chrono_literals;
 
-// Stands for the device: what the guard sets is written into this file.
+// Simulates the device: the values that the guard sets are written to this file.
 class Device {
  public:
   Device() {
@@ -41,7 +41,7 @@ class Device {
     std::getline(file, line, '\0');
     return line;
   }
-  // The same, but after it has become `wanted` or some seconds have passed.
+  // Waits up to a few seconds for the content to equal `wanted`, and returns it.
   std::string contentOnceIs(const std::string& wanted) const {
     for (int i = 0; i < 5000 && content() != wanted; ++i) std::this_thread::sleep_for(1ms);
     return content();
@@ -65,7 +65,7 @@ std::unique_ptr<ControlGuard> guardOf(const Device& device) {
   return guard;
 }
 
-// The one child of this process; 0 when there is none.
+// The only child of this process; 0 if there is none.
 pid_t childOf(pid_t parent) {
   std::ifstream file("/proc/" + std::to_string(parent) + "/task/" + std::to_string(parent) + "/children");
   pid_t child = 0;
@@ -85,7 +85,7 @@ TEST(ProjectorGuardTest, SetsTheValuesInOrderWhenItIsDestroyedAndLeavesNoProcess
   EXPECT_EQ(errno, ECHILD);
 }
 
-// Runs the end in a process that has a guard; returns the guard's number.
+// Calls `end` in a process with a guard and returns the guard's process ID.
 template <class End>
 pid_t processThatEnds(const Device& device, End&& end) {
   ::prctl(PR_SET_CHILD_SUBREAPER, 1);
@@ -124,7 +124,7 @@ TEST(ProjectorGuardTest, SetsTheValuesWhenItsProcessExitsWithoutDestroyingIt) {
 TEST(ProjectorGuardTest, SetsTheValuesWhenItsProcessIsKilledThoughACopyOfThatLivesOn) {
   const Device device;
   const pid_t guard = processThatEnds(device, [] {
-    if (::fork() == 0) {  // it has the connection too
+    if (::fork() == 0) {  // the copy also holds the connection
       ::alarm(10);
       ::pause();
     }

@@ -34,7 +34,7 @@ class SystemVideoKernel final : public V4l2Api {
   int map(int descriptor, std::size_t length, std::int64_t offset, void** address) override {
     void* const mapped = ::mmap(nullptr, length, PROT_READ, MAP_SHARED, descriptor, offset);
     if (mapped == MAP_FAILED) return -errno;
-    // A copy of the process that lives on would keep the device's buffers in use.
+    // A forked copy of this process would otherwise keep the device's buffers in use.
     ::madvise(mapped, length, MADV_DONTFORK);
     *address = mapped;
     return 0;

@@ -1,4 +1,4 @@
-// V4l2Api: what the capture service asks of the system, so that a made-up driver can stand in for it.
+// V4l2Api: the system calls of the capture service, replaceable by a fake driver.
 #pragma once
 
 #include <poll.h>
@@ -14,14 +14,14 @@
 
 namespace quazor {
 
-// A control of a video node and the value that it is to get.
+// A control of a video node and the value to set.
 struct ControlValue {
   std::uint32_t control = 0;  // V4L2_CID_...
   std::int64_t value = 0;
   bool is64Bit = false;  // the control's type is V4L2_CTRL_TYPE_INTEGER64
 };
 
-// Sets controls of a video node when it is destroyed, and also when its process ends in any other way.
+// Sets controls of a video node when it is destroyed, and also if the process ends in any other way.
 // Thread: one at a time.
 class ControlGuard {
  public:
@@ -31,8 +31,7 @@ class ControlGuard {
   virtual ~ControlGuard() = default;
 };
 
-// System calls, as the system has them, but for their results: what fails returns the negated error number, and a call
-// that a signal interrupts is made again.
+// Thin wrappers of system calls. They return a negated error number on failure and restart after a signal.
 //
 // Thread: any.
 class V4l2Api {
@@ -45,29 +44,30 @@ class V4l2Api {
   // Opens a device for reading and writing, without blocking calls. Returns the descriptor.
   virtual int open(const std::string& path) = 0;
   virtual void close(int descriptor) = 0;
-  // Takes the device for this descriptor alone, among those who ask for it in this way; -EWOULDBLOCK when it is taken.
+  // Locks the device for this descriptor among all callers of this function; -EWOULDBLOCK if it is locked.
   virtual int lock(int descriptor) = 0;
   virtual int ioctl(int descriptor, unsigned long request, void* argument) = 0;
-  // Maps a buffer of the device; copies of the process do not have it. In `address` where it is.
+  // Maps a buffer of the device and stores its address in `address`. Forked copies of the process do not inherit it.
   virtual int map(int descriptor, std::size_t length, std::int64_t offset, void** address) = 0;
   virtual void unmap(void* address, std::size_t length) = 0;
-  // Waits for any of the descriptors; a negative timeout waits for ever. May return early, with nothing.
+  // Waits for any of the descriptors; a negative timeout means no limit. May return early without an event.
   virtual int poll(std::span<pollfd> descriptors, std::chrono::nanoseconds timeout) = 0;
 
-  // A descriptor that polls as readable from signalEvent() to clearEvent(). To be closed.
+  // A descriptor that is readable from signalEvent() until clearEvent(). The caller closes it.
   virtual int makeEvent() = 0;
   virtual void signalEvent(int event) = 0;
   virtual void clearEvent(int event) = 0;
 
-  // The clock that buffers are stamped by (CLOCK_MONOTONIC).
+  // The clock of buffer time stamps (CLOCK_MONOTONIC).
   virtual std::chrono::nanoseconds now() = 0;
 
-  // A guard that sets `off`, in this order, on the device at `path`. On failure null, and in `number` the error number.
+  // A guard that sets `off`, in this order, on the device at `path`. Returns null and an error number in `number` on
+  // failure.
   virtual std::unique_ptr<ControlGuard> guardControls(const std::string& path, const std::vector<ControlValue>& off,
                                                       int* number) = 0;
 };
 
-// Makes a call of the system until no signal interrupts it. Its result, or the negated error number.
+// Repeats a system call while signals interrupt it. Returns its result, or the negated error number.
 template <class Call>
 int uninterrupted(Call&& call) {
   int result = 0;
@@ -77,7 +77,7 @@ int uninterrupted(Call&& call) {
   return result < 0 ? -errno : result;
 }
 
-// The running system's.
+// The calls of the running system.
 std::shared_ptr<V4l2Api> systemVideoKernel();
 
 }  // namespace quazor

@@ -1,4 +1,4 @@
-// The running system's calls, on what every system has.
+// The calls of the running system, on files that every system has.
 #include "backends/linux/video/v4l2_api.h"
 
 #include "backends/linux/video/projector_guard.h"
@@ -26,7 +26,7 @@ namespace {
 
 using namespace std::chrono_literals;
 
-// Few descriptors may be open while it lives.
+// Limits the number of open descriptors during its lifetime.
 class FewDescriptors {
  public:
   FewDescriptors() {

@@ -11,13 +11,13 @@
 namespace quazor {
 namespace {
 
-// Drivers list some hundreds of controls or formats at most; one that goes on for ever must not hold us.
+// Drivers list some hundreds of controls or formats at most; the limit stops one that never ends its list.
 constexpr std::uint32_t kMaxItems = 4096;
 
-// A text of the driver in a field of fixed size, which it may fill to the last byte.
-std::string codeText(std::uint32_t code) {
+// The four characters of a pixel format.
+std::string fourccText(std::uint32_t fourcc) {
   std::string text;
-  for (int shift = 0; shift < 32; shift += 8) text += static_cast<char>(code >> shift & 0x7f);
+  for (int shift = 0; shift < 32; shift += 8) text += static_cast<char>(fourcc >> shift & 0x7f);
   return text;
 }
 
@@ -41,7 +41,7 @@ std::string textOf(FrameInterval interval) {
 
 bool takes(const VideoControl& control, std::int64_t value) {
   const bool hasRange = control.type != V4L2_CTRL_TYPE_BUTTON && control.type != V4L2_CTRL_TYPE_BITMASK;
-  return !hasRange || (value >= control.lowest && value <= control.highest);
+  return !hasRange || (value >= control.minimum && value <= control.maximum);
 }
 
 ControlValue valueFor(const VideoControl& control, std::int64_t value) { return {control.id, value, is64Bit(control)}; }
@@ -95,39 +95,39 @@ std::vector<VideoFormat> V4l2Device::formats() const {
     description.index = index;
     description.type = isCamera ? V4L2_BUF_TYPE_VIDEO_CAPTURE : V4L2_BUF_TYPE_META_CAPTURE;
     if (call(VIDIOC_ENUM_FMT, &description) != 0) break;
-    VideoFormat format{index, codeText(description.pixelformat), fixedText(description.description), {}};
+    VideoFormat format{index, fourccText(description.pixelformat), fixedText(description.description), {}};
     if (isCamera) format.sizes = sizesOf(description.pixelformat);
     formats.push_back(std::move(format));
   }
   return formats;
 }
 
-std::vector<FrameSize> V4l2Device::sizesOf(std::uint32_t code) const {
+std::vector<FrameSize> V4l2Device::sizesOf(std::uint32_t fourcc) const {
   std::vector<FrameSize> sizes;
   for (std::uint32_t index = 0; index < kMaxItems; ++index) {
     v4l2_frmsizeenum entry{};
     entry.index = index;
-    entry.pixel_format = code;
+    entry.pixel_format = fourcc;
     if (call(VIDIOC_ENUM_FRAMESIZES, &entry) != 0) break;
     const bool discrete = entry.type == V4L2_FRMSIZE_TYPE_DISCRETE;
     FrameSize size;
     size.width = discrete ? entry.discrete.width : entry.stepwise.min_width;
     size.height = discrete ? entry.discrete.height : entry.stepwise.min_height;
-    size.highestWidth = discrete ? size.width : entry.stepwise.max_width;
-    size.highestHeight = discrete ? size.height : entry.stepwise.max_height;
-    listIntervals(code, size);
+    size.maximumWidth = discrete ? size.width : entry.stepwise.max_width;
+    size.maximumHeight = discrete ? size.height : entry.stepwise.max_height;
+    listIntervals(fourcc, size);
     sizes.push_back(std::move(size));
-    if (!discrete) break;  // such a driver has this one entry
+    if (!discrete) break;  // otherwise the range is the only entry
   }
   return sizes;
 }
 
-// Of a range of sizes, those of the lowest.
-void V4l2Device::listIntervals(std::uint32_t code, FrameSize& size) const {
+// For a range of sizes, lists the intervals of the smallest size.
+void V4l2Device::listIntervals(std::uint32_t fourcc, FrameSize& size) const {
   for (std::uint32_t index = 0; index < kMaxItems; ++index) {
     v4l2_frmivalenum entry{};
     entry.index = index;
-    entry.pixel_format = code;
+    entry.pixel_format = fourcc;
     entry.width = size.width;
     entry.height = size.height;
     if (call(VIDIOC_ENUM_FRAMEINTERVALS, &entry) != 0) return;
@@ -160,12 +160,12 @@ bool V4l2Device::setFormat(std::uint32_t index, std::uint32_t width, std::uint32
   wanted.fmt.pix.height = height;
   wanted.fmt.pix.pixelformat = description.pixelformat;
   wanted.fmt.pix.field = V4L2_FIELD_ANY;
-  // The answer to the second may differ from that to the first, when something else of the device has changed.
+  // VIDIOC_S_FMT may return another format than VIDIOC_TRY_FMT if other settings of the device changed in between.
   const auto isGranted = [&](const v4l2_pix_format& given) {
     if (given.width == width && given.height == height && given.pixelformat == description.pixelformat) return true;
     failLinux(error, LinuxErrorCode::kNotSupported,
               formatMessage("%@: format %@ (%@) of %@ x %@ is not available; the driver offers %@ of %@ x %@.", path_,
-                            index, codeText(description.pixelformat), width, height, codeText(given.pixelformat),
+                            index, fourccText(description.pixelformat), width, height, fourccText(given.pixelformat),
                             given.width, given.height));
     return false;
   };
@@ -228,8 +228,8 @@ std::optional<std::int64_t> V4l2Device::read(const VideoControl& control, Diagno
 bool V4l2Device::set(const VideoControl& control, std::int64_t value, DiagnosticErrorPtr* error) {
   if (!takes(control, value)) {
     failLinux(error, LinuxErrorCode::kBadValue,
-              formatMessage("%@: the control \"%@\" takes %@ to %@, not %@.", path_, control.name, control.lowest,
-                            control.highest, value));
+              formatMessage("%@: the control \"%@\" accepts %@ to %@, not %@.", path_, control.name, control.minimum,
+                            control.maximum, value));
     return false;
   }
   v4l2_ext_control entry{};

@@ -12,7 +12,7 @@
 namespace quazor {
 namespace {
 
-// N of "videoN"; nothing for other names (radios, sub-devices).
+// The N of "videoN"; nothing for other names (radios, sub-devices).
 std::optional<std::uint32_t> numberOf(std::string_view name) {
   constexpr std::string_view kPrefix = "video";
   if (!name.starts_with(kPrefix)) return std::nullopt;
@@ -112,9 +112,9 @@ std::optional<V4l2DeviceInfo> findVideoNode(const std::vector<V4l2DeviceInfo>& n
     failLinux(error, LinuxErrorCode::kAmbiguous, text + "there are " + listOf(fitting) + ".");
     return std::nullopt;
   }
-  text += ofKind.empty() ? "there is none at all" : "there are " + listOf(ofKind);
+  text += ofKind.empty() ? "there is none" : "there are " + listOf(ofKind);
   const std::vector<const V4l2DeviceInfo*> closed = unopened(nodes);
-  if (!closed.empty()) text += "; what is behind these is not known: " + listOf(closed);
+  if (!closed.empty()) text += "; these could not be opened: " + listOf(closed);
   const bool noAccess = std::ranges::any_of(closed, [](const V4l2DeviceInfo* node) {
     return node->problem->code() == static_cast<std::int64_t>(LinuxErrorCode::kNoAccess);
   });

@@ -1,4 +1,4 @@
-// The video nodes of this machine: what they are, what they can do, and which of them a binding means.
+// The video nodes of this machine, their capabilities, and which of them a binding selects.
 #pragma once
 
 #include "backends/linux/binding/binding.h"
@@ -15,7 +15,7 @@
 
 namespace quazor {
 
-// Seconds from frame to frame.
+// Seconds per frame.
 struct FrameInterval {
   std::uint32_t numerator = 0;
   std::uint32_t denominator = 1;
@@ -24,20 +24,20 @@ struct FrameInterval {
   friend bool operator==(const FrameInterval&, const FrameInterval&) = default;
 };
 
-// A frame size, or, when the highest differs from the lowest, all sizes between them.
+// A frame size or, if the maximum differs from the minimum, a range of sizes.
 struct FrameSize {
   std::uint32_t width = 0;
   std::uint32_t height = 0;
-  std::uint32_t highestWidth = 0;
-  std::uint32_t highestHeight = 0;
-  std::vector<FrameInterval> intervals;  // those that there are, or the shortest and the longest
+  std::uint32_t maximumWidth = 0;
+  std::uint32_t maximumHeight = 0;
+  std::vector<FrameInterval> intervals;  // all intervals, or the shortest and the longest
   bool anyIntervalBetween = false;
 };
 
 struct VideoFormat {
-  std::uint32_t index = 0;  // the driver's, which FormatIndex means
-  std::string code;         // four characters, as "YUYV"
-  std::string text;         // the driver's name for it
+  std::uint32_t index = 0;  // the driver's index, used as FormatIndex
+  std::string fourcc;       // four characters, for example "YUYV"
+  std::string description;  // the driver's name for the format
   std::vector<FrameSize> sizes;
 };
 
@@ -45,61 +45,61 @@ struct VideoControl {
   std::uint32_t id = 0;
   std::uint32_t type = 0;  // V4L2_CTRL_TYPE_...
   std::string name;
-  std::int64_t lowest = 0;
-  std::int64_t highest = 0;
-  std::int64_t usual = 0;  // the driver's default
+  std::int64_t minimum = 0;
+  std::int64_t maximum = 0;
+  std::int64_t defaultValue = 0;
 };
 
 enum class VideoNodeKind {
-  kCamera,    // captures video to buffers that a program maps
-  kMetadata,  // captures metadata in the same way
-  kOther      // what the capture service does not use: outputs, radios, cameras that only read() or have several planes
+  kCamera,    // captures video to buffers that can be mapped
+  kMetadata,  // captures metadata to buffers that can be mapped
+  kOther      // not supported: outputs, radios, and cameras with only read() or several planes
 };
 
 struct V4l2DeviceInfo {
-  std::filesystem::path path;  // as /dev/video0
-  std::string systemName;      // what sysfs calls it, as "vivid-000-vid-cap"
-  // What follows is empty when the node cannot be opened; then `problem` says why.
+  std::filesystem::path path;  // for example /dev/video0
+  std::string systemName;      // the name in sysfs, for example "vivid-000-vid-cap"
+  // The members below are empty if the node cannot be opened; `problem` then gives the reason.
   std::string driver;
   std::string card;
   std::string busInfo;
-  std::uint32_t capabilities = 0;  // V4L2_CAP_..., the node's own
+  std::uint32_t capabilities = 0;  // V4L2_CAP_... of the node
   VideoNodeKind kind = VideoNodeKind::kOther;
   DiagnosticErrorPtr problem;
 };
 
-// What a camera or metadata node offers besides.
+// The formats and controls of a camera or metadata node.
 struct VideoNodeDetails {
   std::vector<VideoFormat> formats;
   std::vector<VideoControl> controls;
 };
 
-// Where the system tells of its devices and where they are.
+// The directories of the system's devices.
 struct DeviceRoots {
   std::filesystem::path sysfs = "/sys";
   std::filesystem::path dev = "/dev";
 };
 
-// All video nodes, by their numbers. A machine without any gives none.
+// All video nodes, sorted by number; empty if the machine has none.
 std::vector<V4l2DeviceInfo> videoNodes(const std::shared_ptr<V4l2Api>& kernel, const DeviceRoots& roots = {});
 
-// Asks the node's driver. Nothing, and an error, when it cannot be opened.
+// Queries the node's driver. Returns nothing and an error if the node cannot be opened.
 std::optional<VideoNodeDetails> detailsOf(const std::shared_ptr<V4l2Api>& kernel, const V4l2DeviceInfo& node,
                                           DiagnosticErrorPtr* error);
 
-// Whether the node is what the binding means; one that cannot be opened is not.
+// True if the binding selects the node; a node that cannot be opened never matches.
 bool matches(const V4l2DeviceInfo& node, const VideoNodeMatch& match);
 
-// The one node of that kind that the binding means. Nothing, and an error that lists what there is, when there is none
-// (kNoDevice, or kNoAccess when only nodes that may not be opened are left) or more than one (kAmbiguous). `purpose`
-// begins the message, as "BackFacingCamera".
+// The only node of that kind that the binding selects. Returns nothing and an error that lists the candidates if none
+// matches (kNoDevice, or kNoAccess if all remaining nodes lack permission) or several do (kAmbiguous). The message
+// begins with `purpose`, for example "BackFacingCamera".
 std::optional<V4l2DeviceInfo> findVideoNode(const std::vector<V4l2DeviceInfo>& nodes, VideoNodeKind kind,
                                             const VideoNodeMatch& match, const std::string& purpose,
                                             DiagnosticErrorPtr* error);
 
-// One line that tells the node to a person: "/dev/video0 (driver vivid, card vivid, bus platform:vivid-000)".
+// A user-readable line: "/dev/video0 (driver vivid, card vivid, bus platform:vivid-000)".
 std::string textOf(const V4l2DeviceInfo& node);
-// "driver vivid, bus platform:vivid-000"; "any" when it asks for nothing.
+// "driver vivid, bus platform:vivid-000"; "any" if it matches everything.
 std::string textOf(const VideoNodeMatch& match);
 
 }  // namespace quazor

@@ -78,21 +78,21 @@ TEST(VideoNodesTest, DetailsAreFormatsWithSizesAndIntervalsAndControls) {
   ASSERT_EQ(details->formats.size(), 2U);
   const VideoFormat& grey = details->formats[1];
   EXPECT_EQ(grey.index, 1U);
-  EXPECT_EQ(grey.code, "GREY");
-  EXPECT_EQ(grey.text, "8-bit grey");
+  EXPECT_EQ(grey.fourcc, "GREY");
+  EXPECT_EQ(grey.description, "8-bit grey");
   ASSERT_EQ(grey.sizes.size(), 2U);
   EXPECT_EQ(grey.sizes[1].width, 640U);
-  EXPECT_EQ(grey.sizes[1].highestHeight, 480U);
+  EXPECT_EQ(grey.sizes[1].maximumHeight, 480U);
   EXPECT_EQ(grey.sizes[1].intervals, (std::vector<FrameInterval>{{1, 5}, {1, 25}}));
   EXPECT_FALSE(grey.sizes[1].anyIntervalBetween);
   ASSERT_EQ(details->controls.size(), 1U);
   EXPECT_EQ(details->controls[0].name, "Brightness");
-  EXPECT_EQ(details->controls[0].lowest, -64);
-  EXPECT_EQ(details->controls[0].highest, 64);
-  EXPECT_EQ(details->controls[0].usual, 12);
+  EXPECT_EQ(details->controls[0].minimum, -64);
+  EXPECT_EQ(details->controls[0].maximum, 64);
+  EXPECT_EQ(details->controls[0].defaultValue, 12);
 }
 
-// A driver that answers with ranges.
+// A driver that reports ranges.
 class RangesKernel final : public FakeV4l2Api {
  public:
   int ioctl(int descriptor, unsigned long request, void* argument) override {
@@ -120,9 +120,9 @@ TEST(VideoNodesTest, RangesOfSizesAndIntervalsAreToldByTheirEnds) {
   ASSERT_EQ(details->formats[0].sizes.size(), 1U);
   const FrameSize& size = details->formats[0].sizes[0];
   EXPECT_EQ(size.width, 16U);
-  EXPECT_EQ(size.highestWidth, 1920U);
+  EXPECT_EQ(size.maximumWidth, 1920U);
   EXPECT_EQ(size.height, 8U);
-  EXPECT_EQ(size.highestHeight, 1080U);
+  EXPECT_EQ(size.maximumHeight, 1080U);
   EXPECT_EQ(size.intervals, (std::vector<FrameInterval>{{1, 60}, {1, 1}}));
   EXPECT_TRUE(size.anyIntervalBetween);
 }
@@ -166,7 +166,7 @@ TEST_F(FindingTest, NoneOrSeveralAreToldWithWhatThereIs) {
   EXPECT_EQ(find({{}, "fake camera", {}}), "3 Port: more than one camera is card fake camera; there are " + all + ".");
   EXPECT_EQ(find({}), "3 Port: more than one camera is any; there are " + all + ".");
   nodes_.clear();
-  EXPECT_EQ(find({}), "2 Port: no camera is any; there is none at all.");
+  EXPECT_EQ(find({}), "2 Port: no camera is any; there is none.");
 }
 
 TEST_F(FindingTest, WhatCannotBeOpenedIsNamedForItMayBeTheOne) {
@@ -176,7 +176,7 @@ TEST_F(FindingTest, WhatCannotBeOpenedIsNamedForItMayBeTheOne) {
   nodes_ = videoNodes(kernel_, kernel_->roots());
   nodes_.erase(nodes_.begin(), nodes_.begin() + 3);
   EXPECT_EQ(find({"uvc", {}, {}}),
-            "4 Port: no camera is driver uvc; there is none at all; what is behind these is not known: /dev/video3 "
+            "4 Port: no camera is driver uvc; there is none; these could not be opened: /dev/video3 "
             "(open on /dev/video3 failed: Permission denied (EACCES)).");
   closed.openProblem = ENXIO;
   kernel_->add(3, closed);
@@ -197,8 +197,8 @@ TEST(OpenedVideoNodeTest, ControlsKeepTheirRangesAndTheirWidth) {
   };
   EXPECT_EQ(set("Narrow", -5), "done");
   EXPECT_EQ(node->read(*node->control("Narrow", nullptr), nullptr), -5);
-  EXPECT_EQ(set("Narrow", 6), "6 " + path + ": the control \"Narrow\" takes -5 to 5, not 6.");
-  EXPECT_EQ(set("Narrow", -6), "6 " + path + ": the control \"Narrow\" takes -5 to 5, not -6.");
+  EXPECT_EQ(set("Narrow", 6), "6 " + path + ": the control \"Narrow\" accepts -5 to 5, not 6.");
+  EXPECT_EQ(set("Narrow", -6), "6 " + path + ": the control \"Narrow\" accepts -5 to 5, not -6.");
   EXPECT_EQ(set("Wide", 1LL << 40), "done");
   EXPECT_EQ(node->read(*node->control("Wide", nullptr), nullptr), 1LL << 40);
   EXPECT_EQ(set("Button", 1), "done") << "a button has no range";

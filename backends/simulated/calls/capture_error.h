@@ -13,24 +13,24 @@ namespace quazor {
 
 inline constexpr std::string_view SimulatedCaptureErrorDomain = "SimulatedCaptureErrorDomain";
 
-// The codes of the domain. Messages name the object, the property and the value, and say what would be right.
+// The codes of the domain. Messages name the object, the property, the value and what is allowed.
 enum class CaptureErrorCode : std::int64_t {
-  kInjected = 1,             // a fault of the scenario asked for a failure and gave no error of its own
+  kInjected = 1,             // a fault of the scenario requested a failure and gave no error of its own
   kNoDevice = 2,             // the phone has no capture device
-  kUnknownProperty = 3,      // the object has no property of that name
+  kUnknownProperty = 3,      // the object has no property with that name
   kReadOnlyProperty = 4,     // the property cannot be set
-  kWrongType = 5,            // the value is not of the property's type
-  kOutOfRange = 6,           // the value is of the right type but not one the property takes
-  kUnsupported = 7,          // this camera or group cannot do that
+  kWrongType = 5,            // the value has the wrong type
+  kOutOfRange = 6,           // the value has the right type but is not allowed
+  kUnsupported = 7,          // this camera or group does not support it
   kNotControlled = 8,        // the caller has no control of the stream
   kControlledByAnother = 9,  // another user has control of the stream
-  kWrongState = 10,          // not now: the stream runs, or does not run, or something has to be set first
+  kWrongState = 10,          // not possible now: the stream runs or does not run, or something must be set first
   kUnreadableProperty = 11,  // the property has no value to read
   kForeignObject = 12,       // the stream or group belongs to another device, or to no device
   kInvalidated = 13          // the device has been invalidated
 };
 
-// Stores an error of the service where `error` is not null.
+// Stores an error of the service unless `error` is null.
 inline void failSimulatedCapture(DiagnosticErrorPtr* error, CaptureErrorCode code, std::string message) {
   if (error == nullptr) return;
   *error = errorWithMessage(SimulatedCaptureErrorDomain, static_cast<std::int64_t>(code), std::move(message), nullptr);

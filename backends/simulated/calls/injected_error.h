@@ -1,4 +1,4 @@
-// The errors of calls that a fault makes fail.
+// Errors of calls that a fault makes fail.
 #pragma once
 
 #include "backends/faults/call_interceptor.h"
@@ -7,7 +7,7 @@
 
 namespace quazor {
 
-// The error of the service that the operation belongs to, with `sentence` as its message. Any thread.
+// An error of the operation's service with the message `sentence`. Thread: any.
 DiagnosticErrorPtr simulatedInjectedError(const CallSite& site, std::string sentence);
 
 }  // namespace quazor

@@ -9,7 +9,7 @@
 namespace quazor {
 namespace {
 
-// Null where no output with a handler is enabled.
+// Returns null if no output with a handler is enabled.
 std::shared_ptr<FrameDelivery> makeDelivery(const CaptureHardware& hardware, std::size_t index, const StreamRun& times,
                                             const CameraSettings& settings) {
   FrameDelivery::Source source;

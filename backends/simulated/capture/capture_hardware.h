@@ -1,4 +1,4 @@
-// CaptureHardware: the state of the simulated cameras, which all users of the capture service share.
+// CaptureHardware: the state of the simulated cameras, shared by all users of the capture service.
 #pragma once
 
 #include "backends/capture/capture_back.h"
@@ -21,32 +21,32 @@
 
 namespace quazor {
 
-// One stretch of a camera's stream.
+// One streaming run of a camera.
 //
 // Thread: any, holding the hardware's mutex.
 struct SimulatedRun final : CaptureRun {
   StreamRun times;
-  std::shared_ptr<FrameDelivery> delivery;  // null where nothing is delivered, and after the stop
+  std::shared_ptr<FrameDelivery> delivery;  // null without a handler, and after the stop
 };
 
 struct CameraState {
   Camera camera;
-  std::shared_ptr<SimulatedRun> running;  // null while the stream does not run
+  std::shared_ptr<SimulatedRun> running;  // null if the stream does not run
 
-  // The highest frame rate of the format that is set.
+  // The highest frame rate of the current format.
   double formatMaximum(const CameraSettings& settings) const;
-  // The rate at which frames would really come.
+  // The actual frame rate.
   double deliveredRate(const CameraSettings& settings) const;
-  // What ErrorCounters reads: the scenario's counters and what they have grown by in `run`, the present or the last
-  // stretch, or null. Nothing when they cannot be read.
+  // ErrorCounters: the scenario's counters plus their growth in `run`, which is the current or the last run, or null.
+  // Nothing if they cannot be read.
   std::optional<Dictionary> errorCounters(const StreamRun* run, std::chrono::nanoseconds now) const;
 };
 
-// Plain data under one lock: what of the cameras other devices of the phone depend on.
+// State of the cameras that other devices of the phone also use, under one lock.
 //
-// Thread: any, holding `mutex`; what is const needs no lock.
+// Thread: any, holding `mutex`; const members need no lock.
 struct CaptureHardware {
-  // Throws std::invalid_argument when a camera has no format.
+  // Throws std::invalid_argument if a camera has no format.
   CaptureHardware(const Scenario& scenario, std::shared_ptr<Clock> clock, std::shared_ptr<Concurrency> concurrency);
 
   const CaptureDeviceConfig device;
@@ -57,14 +57,14 @@ struct CaptureHardware {
   std::mutex mutex;
   std::vector<CameraState> cameras;
   std::size_t runningStreams = 0;
-  std::chrono::nanoseconds streamedBefore{0};  // until the last moment at which no stream ran
+  std::chrono::nanoseconds streamedBefore{0};  // total streaming time before streamingSince
   std::chrono::nanoseconds streamingSince{0};  // while any stream runs
 
-  // Starts the stream of the camera of that index, at the rate that is set now.
+  // Starts the stream of the camera with that index, at the current rate.
   std::shared_ptr<SimulatedRun> start(std::size_t camera, const CameraSettings& settings);
-  // The stretch ends now, unless it has already, and no handler begins any more.
+  // Ends the run now, unless it has already ended; no further handler starts.
   void stop(SimulatedRun& run);
-  // For how long any stream has been running until now.
+  // The total time during which any stream has run.
   std::chrono::nanoseconds streamedTime() const;
 };
 

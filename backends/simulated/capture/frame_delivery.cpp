@@ -12,7 +12,7 @@ namespace {
 
 __extension__ using Wide = __int128;
 
-// Nanoseconds times millionths of a frame per second, for one frame.
+// The scale of nanoseconds times millionths of a frame per second.
 constexpr Wide kFrame = Wide{1'000'000'000} * 1'000'000;
 
 constexpr std::int32_t kTimescale = 1'000'000'000;
@@ -81,7 +81,7 @@ void FrameDelivery::begin(Concurrency& concurrency) {
   for (std::size_t i = 0; i < queues_.size(); ++i) arm(i, i);
 }
 
-// A queue's next frame. The tasks do not keep the delivery: with its owner's reference the frames end.
+// Schedules a queue's next frame. The tasks do not own the delivery, so frames end with the owner's reference.
 void FrameDelivery::arm(std::size_t queue, std::uint64_t frame) {
   queues_[queue]->asyncAfter(arrival(frame) - sinceStart(), [weak = weak_from_this(), queue, frame] {
     const std::shared_ptr<FrameDelivery> self = weak.lock();
@@ -117,7 +117,7 @@ bool FrameDelivery::isDropped(std::uint64_t frame) const {
   return camera.droppedFrames.contains(frame) || (camera.dropEvery != 0 && (frame + 1) % camera.dropEvery == 0);
 }
 
-// When the frame reaches the handler: a burst holds frames back.
+// The time at which the frame reaches the handler: a burst delays frames.
 std::chrono::nanoseconds FrameDelivery::arrival(std::uint64_t frame) const {
   std::uint64_t with = frame;
   for (const FrameBurst& burst : source_.camera.delivery.bursts) {

@@ -1,4 +1,4 @@
-// FrameDelivery: one stretch of a stream, as its handlers see it.
+// FrameDelivery: delivers the frames and events of one streaming run to its handlers.
 #pragma once
 
 #include "backends/simulated/capture/pixel_buffer_pool.h"
@@ -24,22 +24,22 @@
 
 namespace quazor {
 
-// The time since a stream's start at which its frame `frame`, counted from 0, has come: (frame + 1) / rate, rounded up
-// to the nanosecond and saturated.
+// The time of frame `frame`, counted from 0, since the stream's start: (frame + 1) / rate, rounded up to the nanosecond
+// and saturated.
 std::chrono::nanoseconds frameTime(MicroFrameRate rate, std::uint64_t frame);
 
-// Calls the handlers of a stream's output, on queues of its own, from the stream's start to its stop: frame k at
-// frameTime(k), the scenario's events at theirs. Presentation and event times are in nanoseconds since the stream's
-// start, whenever the handler is called.
+// Calls the handlers of a stream's output, on its own queues, from the stream's start to its stop: frame k at
+// frameTime(k), the scenario's events at their times. Presentation and event times are in nanoseconds since the
+// stream's start, independent of the time of the call.
 //
 // Thread: any. Handlers are called without any lock.
 class FrameDelivery final : public std::enable_shared_from_this<FrameDelivery> {
  public:
   struct Source {
-    std::size_t index = 0;  // the camera's, for the pool
+    std::size_t index = 0;  // index of the camera, for the pool
     Camera camera;
     StreamRun run;
-    bool lit = false;                            // the projector, where there is one, fires
+    bool lit = false;                            // the projector, if any, is on
     std::shared_ptr<PixelBufferHandler> frames;  // either may be null
     std::shared_ptr<EventHandler> events;
   };
@@ -48,22 +48,23 @@ class FrameDelivery final : public std::enable_shared_from_this<FrameDelivery> {
   FrameDelivery(const FrameDelivery&) = delete;
   FrameDelivery& operator=(const FrameDelivery&) = delete;
 
-  // Begins to deliver. Called once; the owner keeps the delivery until it is closed.
+  // Starts delivering. Called once; the owner must keep the delivery until it is closed.
   void begin(Concurrency& concurrency);
-  // From here on no handler begins to run.
+  // After this no handler starts.
   void close();
-  // After close(): waits until no handler runs any more, where the scenario has stops wait. A handler that stops its
-  // own stream is not waited for.
+  // After close(): waits for running handlers, unless the scenario has stops that do not wait. Does not wait for a
+  // handler that stops its own stream.
   void quiesce();
-  // Ends a stop, once: the scenario's frames after the stop are on their way.
+  // Ends a stop, once: sends the frames that the scenario delivers after the stop.
   void finish();
-  // Calls the frame handler with the next `count` frames at once, on this thread, without regard to time; counts from
-  // 0, apart from the frames that come by themselves. For benches. Returns how many were delivered: fewer when the
+  // Passes the next `count` frames to the handler immediately, on this thread; they are numbered from 0, independently
+  // of the regular frames. For tests. Returns the number of delivered frames: fewer if the delivery is closed in the
+  // meantime, 0 without a handler.
   // delivery is closed meanwhile, or 0 without a handler.
   std::uint64_t push(std::uint64_t count);
 
  private:
-  // A handler's call; `entered()` is false, and the call must not be made, when the delivery is closed.
+  // A handler's call; if `entered()` is false, the delivery is closed and the call must not be made.
   class Entry;
 
   void arm(std::size_t queue, std::uint64_t frame);
@@ -78,15 +79,15 @@ class FrameDelivery final : public std::enable_shared_from_this<FrameDelivery> {
   const Source source_;
   const std::shared_ptr<PixelBufferPool> pool_;
   const std::shared_ptr<Clock> clock_;
-  std::optional<Value> usual_;                             // the attachment of frames that are not special
-  std::map<std::uint64_t, std::optional<Value>> special_;  // those that are
+  std::optional<Value> usual_;                             // the attachment of ordinary frames
+  std::map<std::uint64_t, std::optional<Value>> special_;  // attachments of other frames
   std::vector<std::shared_ptr<SerialQueue>> queues_;
   std::atomic<std::uint64_t> pushed_{0};
 
-  std::mutex mutex_;  // guards what follows
+  std::mutex mutex_;  // guards the members below
   std::condition_variable quiet_;
   bool closed_ = false;
-  std::vector<std::thread::id> calling_;  // the threads that are in a handler
+  std::vector<std::thread::id> calling_;  // the threads that are running a handler
 };
 
 }  // namespace quazor

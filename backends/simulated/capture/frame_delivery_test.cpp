@@ -41,7 +41,7 @@ TEST(FrameTimeTest, IsExactAndRoundedUpToTheNanosecond) {
 
 class FrameDeliveryTest : public ::testing::Test {
  protected:
-  // A phone whose camera "front" is what `change` makes of it, with a user who listens to its stream.
+  // A phone whose camera "front" `change` modifies, and a user of its stream.
   template <class Change>
   void make(Change&& change, std::uint64_t seed = 1) {
     Scenario scenario = smallScenario();

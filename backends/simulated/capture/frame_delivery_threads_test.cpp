@@ -17,7 +17,7 @@ namespace {
 
 using namespace std::chrono_literals;
 
-// Lets threads wait for each other, but not for ever.
+// A rendezvous of threads with a timeout.
 class Gate {
  public:
   void open() {
@@ -25,7 +25,7 @@ class Gate {
     open_ = true;
     changed_.notify_all();
   }
-  // Counts the caller in; true when `count` callers have come within seconds.
+  // Waits for `count` callers; returns false after a few seconds.
   bool meet(int count) {
     std::unique_lock lock(mutex_);
     ++came_;
@@ -55,7 +55,7 @@ class FrameDeliveryOnThreadsTest : public ::testing::Test {
     stream_.emplace(*phone_);
   }
 
-  // Waits until all handlers have returned: buffers are given back behind them.
+  // Waits for all handlers to return, because buffers are released after them.
   void settle() {
     const auto deadline = std::chrono::steady_clock::now() + 1min;
     while (!phone_->buffersHeld().empty()) {

@@ -8,11 +8,11 @@
 
 namespace quazor {
 
-// What a healthy projector module reports with a frame: its eighteen entries. `lit`: the projector fires.
+// The eighteen entries that a healthy projector module reports with a frame. `lit`: the projector is on.
 Dictionary healthyMetadata(bool lit);
 
-// The attachment of a frame whose metadata would be `base`: with the overrides of `special`, without what it leaves
-// out, or something else altogether. Nothing when the frame has no attachment.
+// The attachment of a frame with the metadata `base`: with the overrides of `special`, without its removed keys, or of
+// another kind. Nothing if the frame has no attachment.
 std::optional<Value> attachmentOf(Dictionary base, const FrameMetadata& special);
 
 }  // namespace quazor

@@ -1,4 +1,4 @@
-// Counters that grow while something runs.
+// Counters that grow over time.
 #pragma once
 
 #include <chrono>
@@ -6,8 +6,8 @@
 
 namespace quazor {
 
-// What a counter that grows by `perSecond` has grown by after `time`, which is not negative: whole counts, exact, and
-// wrapping at 64 bits.
+// The growth of a counter by `perSecond` after `time`, which must not be negative: whole counts, exact, wrapping at 64
+// bits.
 inline std::uint64_t grownBy(std::uint64_t perSecond, std::chrono::nanoseconds time) {
   __extension__ using Wide = unsigned __int128;
   return static_cast<std::uint64_t>(Wide{perSecond} * static_cast<std::uint64_t>(time.count()) / 1'000'000'000);

@@ -14,7 +14,7 @@ namespace {
 
 using Code = CaptureErrorCode;
 
-// The camera "wide" has a projector here, the others have none.
+// Only the camera "wide" has a projector here.
 class OutputPropertiesTest : public ::testing::Test {
  protected:
   static Scenario scenario() {

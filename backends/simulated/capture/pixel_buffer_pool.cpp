@@ -37,7 +37,7 @@ PixelBuffer& PixelBufferPool::take(std::size_t camera, std::uint64_t frame, std:
 }
 
 void PixelBufferPool::putBack(Buffer& buffer) {
-  std::optional<Value> metadata;  // destroyed after the lock is given back
+  std::optional<Value> metadata;  // destroyed after the lock was released
   const std::lock_guard lock(mutex_);
   metadata.swap(buffer.metadata_);
   buffer.out_ = false;

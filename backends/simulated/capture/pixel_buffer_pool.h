@@ -16,13 +16,13 @@
 
 namespace quazor {
 
-// Hands out buffers and takes them back with their last reference. It grows as needed and owns the memory of all of
-// them, so a buffer that is never given back is not lost: it is told by held().
+// Provides buffers and reclaims them when the last reference is released. Grows as needed and owns the memory of all
+// buffers, so a buffer that is never released is not leaked: held() lists it.
 //
-// Thread: any. Buffers must not be used when the pool is gone.
+// Thread: any. Buffers must not be used after the pool was destroyed.
 class PixelBufferPool final {
  public:
-  // A buffer that has not come back: the index of the camera it came from, and the frame's number.
+  // A buffer that was not released: the index of its camera, and the number of its frame.
   struct Held {
     std::size_t camera = 0;
     std::uint64_t frame = 0;
@@ -34,14 +34,14 @@ class PixelBufferPool final {
   PixelBufferPool(const PixelBufferPool&) = delete;
   PixelBufferPool& operator=(const PixelBufferPool&) = delete;
 
-  // A buffer with one reference, the caller's. `metadata` is its attachment MetadataDictionary.
+  // A buffer with one reference, owned by the caller. `metadata` becomes its attachment MetadataDictionary.
   PixelBuffer& take(std::size_t camera, std::uint64_t frame, std::optional<Value> metadata);
-  // The buffers that are out, by camera and frame.
+  // The buffers in use, by camera and frame.
   std::vector<Held> held() const;
-  // How many buffers have been handed out in all.
+  // The total number of buffers provided.
   std::uint64_t taken() const;
-  // How often a buffer was released that nobody held; such a release has no other effect. A release too many of a
-  // buffer that is out again by then cannot be told from a rightful one.
+  // The number of releases without a matching reference; such a release has no other effect. If the buffer is in use
+  // again, a release too many cannot be detected.
   std::uint64_t strayReleases() const { return strayReleases_.load(std::memory_order_relaxed); }
 
  private:
@@ -58,7 +58,7 @@ class PixelBufferPool final {
 
     PixelBufferPool& pool_;
     std::atomic<std::int64_t> references_{0};
-    bool out_ = false;  // guarded by the pool's mutex, as is what follows while the buffer is not out
+    bool out_ = false;  // guarded by the pool's mutex, like the members below while the buffer is not in use
     Held frame_;
     std::optional<Value> metadata_;
   };
@@ -66,7 +66,7 @@ class PixelBufferPool final {
   void putBack(Buffer& buffer);
 
   std::atomic<std::uint64_t> strayReleases_{0};
-  mutable std::mutex mutex_;  // guards what follows
+  mutable std::mutex mutex_;  // guards the members below
   std::deque<Buffer> buffers_;
   std::vector<Buffer*> free_;
   std::uint64_t taken_ = 0;

@@ -9,14 +9,14 @@ namespace {
 // Large enough for a duration in nanoseconds times two frame rates: 63 + 30 + 30 bits.
 __extension__ using Wide = __int128;
 
-// Nanoseconds times millionths of a frame per second, for one frame.
+// The scale of nanoseconds times millionths of a frame per second.
 constexpr Wide kFrameScale = Wide{1'000'000'000} * 1'000'000;
 
 Wide wide(std::chrono::nanoseconds duration) { return duration.count(); }
 
 Wide dividedUp(Wide dividend, Wide divisor) { return (dividend + divisor - 1) / divisor; }
 
-// How many of the frames 0 to count - 1 are lost.
+// The number of lost frames among 0 to count - 1.
 Wide dropped(const Camera& camera, Wide count) {
   const Wide every = static_cast<Wide>(camera.dropEvery);
   Wide lost = every == 0 ? 0 : count / every;
@@ -43,7 +43,7 @@ SessionCount countSession(const Camera& camera, const StreamRun& run, const Stre
   const Wide late = std::max(Wide{0}, wide(run.started) - wide(master.started));
   const Wide offset = dividedUp(late * masterRate, kFrameScale) + static_cast<Wide>(camera.firstFrameOffset);
 
-  // The camera's own time, from the master's frame with which it begins, in units of 1 / masterRate.
+  // The camera's streaming time since the master's frame with which it starts, in units of 1 / masterRate.
   const Wide streamed = (wide(run.stopped.value_or(now)) - wide(master.started)) * masterRate - offset * kFrameScale;
   if (!camera.deliversFrames || streamed <= 0) return kNoFrames;
   const Wide possible = streamed * rate / (masterRate * kFrameScale);

@@ -1,4 +1,4 @@
-// SimulatedCamera: a camera of the scenario, as the capture service has it.
+// SimulatedCamera: a camera of the scenario as a back of the capture service.
 #pragma once
 
 #include "backends/capture/capture_back.h"
@@ -12,7 +12,7 @@ namespace quazor {
 // Thread: one at a time.
 class SimulatedCamera final : public CameraBack {
  public:
-  // The camera of that index.
+  // The camera with that index.
   SimulatedCamera(std::shared_ptr<CaptureHardware> hardware, std::size_t index);
 
   std::size_t index() const { return index_; }

@@ -1,4 +1,4 @@
-// The simulated capture service: the scenario's cameras behind the service that every backend shares.
+// The simulated capture service: the scenario's cameras, behind the front that all backends share.
 #pragma once
 
 #include "backends/faults/call_interceptor.h"

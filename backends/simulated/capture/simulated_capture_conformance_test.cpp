@@ -5,7 +5,7 @@
 namespace quazor {
 namespace {
 
-// The suite's four cameras, in virtual time.
+// The four cameras that the suite requires, in virtual time.
 class SimulatedCaptureUnderTest {
  public:
   std::shared_ptr<CaptureService> service() { return phone_.platform().capture; }

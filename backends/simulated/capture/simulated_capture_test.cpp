@@ -42,21 +42,22 @@ TEST_F(SimulatedCaptureTest, ObjectsDescribeThemselves) {
 TEST_F(SimulatedCaptureTest, ARunningStreamIsNotGivenBack) {
   ASSERT_TRUE(user_.control({user_.streams[0]}) && user_.wide().start(nullptr));
   EXPECT_EQ(relinquish(user_, {user_.streams[0]}),
-            refusal(Code::kWrongState, "wide is running; stop it before giving it back."));
+            refusal(Code::kWrongState, "wide is running; stop it before releasing control."));
 }
 
 TEST_F(SimulatedCaptureTest, StreamsOfOthersAreRefused) {
   const PhoneUser other(phone_);
   EXPECT_EQ(request(user_, {other.streams[0]}),
-            refusal(Code::kForeignObject, "stream wide (BackFacingCamera) is no stream of this device."));
-  EXPECT_EQ(relinquish(user_, {nullptr}), refusal(Code::kForeignObject, "(null) is no stream of this device."));
+            refusal(Code::kForeignObject, "stream wide (BackFacingCamera) is not a stream of this device."));
+  EXPECT_EQ(relinquish(user_, {nullptr}), refusal(Code::kForeignObject, "(null) is not a stream of this device."));
 }
 
 TEST_F(SimulatedCaptureTest, ConfigurationsThatDoNotFitAreRefusedAndChangeNothing) {
   ASSERT_TRUE(user_.configureSession());
   const PhoneUser other(phone_);
   constexpr const char* kShape =
-      "capture device: MultiCamConfiguration must be a dictionary with the one entry ActiveSynchronizedStreamsGroups, "
+      "capture device: MultiCamConfiguration must be a dictionary with exactly one entry, "
+      "ActiveSynchronizedStreamsGroups, "
       "an array.";
   const struct {
     const char* name;
@@ -70,11 +71,11 @@ TEST_F(SimulatedCaptureTest, ConfigurationsThatDoNotFitAreRefusedAndChangeNothin
       {"an entry more", Dictionary{{"ActiveSynchronizedStreamsGroups", Array{}}, {"Speed", 1}}, Code::kWrongType,
        kShape},
       {"no group", groups({"back"}), Code::kForeignObject,
-       "capture device: ActiveSynchronizedStreamsGroups must hold groups of this device, not the string back."},
+       "capture device: ActiveSynchronizedStreamsGroups must contain groups of this device, not the string back."},
       {"a group of another user", groups({other.groups[0]}), Code::kForeignObject,
-       "capture device: ActiveSynchronizedStreamsGroups must hold groups of this device, not group back."},
+       "capture device: ActiveSynchronizedStreamsGroups must contain groups of this device, not group back."},
       {"a group twice", groups({user_.groups[0], user_.groups[0]}), Code::kOutOfRange,
-       "capture device: ActiveSynchronizedStreamsGroups must hold a group once, not group back twice."},
+       "capture device: ActiveSynchronizedStreamsGroups must contain a group once, not group back twice."},
       {"a group whose master is not active", groups({user_.groups[1]}), Code::kWrongState,
        "group selfie: its master front is not active; set ActiveStreams first."},
   };

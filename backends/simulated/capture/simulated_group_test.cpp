@@ -15,7 +15,7 @@ Dictionary masterConfiguration(std::string_view port, Value slave) {
   return {{"SlaveConfigurationByPortType", Dictionary{{std::string(port), std::move(slave)}}}};
 }
 
-// Not of the phone.
+// A stream of another device.
 class ForeignStream final : public CaptureStream {
  public:
   std::string description() const override { return "foreign stream"; }
@@ -53,15 +53,15 @@ TEST_F(SimulatedGroupTest, ValuesThatDoNotFitAreRefusedAndChangeNothing) {
       {"no array", "ActiveStreams", 1, Code::kWrongType,
        "back: ActiveStreams must be an array of streams, not the number 1."},
       {"no stream", "ActiveStreams", Array{"wide"}, Code::kWrongType,
-       "back: ActiveStreams must hold streams, not the string wide."},
+       "back: ActiveStreams must contain streams, not the string wide."},
       {"a stream of nobody", "ActiveStreams", Array{std::make_shared<ForeignStream>()}, Code::kWrongType,
-       "back: ActiveStreams must hold streams, not foreign stream."},
+       "back: ActiveStreams must contain streams, not foreign stream."},
       {"a stream of another group", "ActiveStreams", Array{user_.streams[2]}, Code::kForeignObject,
-       "back: ActiveStreams must hold streams of the group, not stream front (FrontFacingCamera)."},
+       "back: ActiveStreams must contain streams of the group, not stream front (FrontFacingCamera)."},
       {"a stream of another user", "ActiveStreams", Array{other.streams[0]}, Code::kForeignObject,
-       "back: ActiveStreams must hold streams of the group, not stream wide (BackFacingCamera)."},
+       "back: ActiveStreams must contain streams of the group, not stream wide (BackFacingCamera)."},
       {"a stream twice", "ActiveStreams", Array{user_.streams[0], user_.streams[0]}, Code::kOutOfRange,
-       "back: ActiveStreams must hold a stream once, not stream wide (BackFacingCamera) twice."},
+       "back: ActiveStreams must contain a stream once, not stream wide (BackFacingCamera) twice."},
       {"the master", "SynchronizationMaster", user_.streams[1], Code::kReadOnlyProperty,
        "back: SynchronizationMaster can only be read."},
       {"the supported keys", "MasterConfigurationSupportedKeys", Array{}, Code::kReadOnlyProperty,
@@ -72,7 +72,7 @@ TEST_F(SimulatedGroupTest, ValuesThatDoNotFitAreRefusedAndChangeNothing) {
       {"a configuration that is no dictionary", "MasterConfiguration", 1, Code::kWrongType,
        "back: MasterConfiguration must be a dictionary, not the number 1."},
       {"a configuration of another kind", "MasterConfiguration", Dictionary{{"Speed", 1}}, Code::kOutOfRange,
-       "back: MasterConfiguration must have the one entry SlaveConfigurationByPortType."},
+       "back: MasterConfiguration must have exactly one entry, SlaveConfigurationByPortType."},
       {"slaves that are no dictionary", "MasterConfiguration", Dictionary{{"SlaveConfigurationByPortType", 1}},
        Code::kWrongType, "back: SlaveConfigurationByPortType must be a dictionary, not the number 1."},
       {"the port of another group", "MasterConfiguration",

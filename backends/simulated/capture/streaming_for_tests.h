@@ -1,4 +1,4 @@
-// A user of one stream who writes down what comes, for the tests of this folder.
+// A user of one stream who records frames and events, for the tests of this folder.
 #pragma once
 
 #include "backends/simulated/capture/frame_metadata.h"
@@ -20,12 +20,12 @@
 
 namespace quazor {
 
-// Has control of the stream of the third camera of smallScenario(), whose output has handlers and is enabled.
-// What it wrote down can be read on any thread; handlers run on those of the phone.
+// Has control of the stream of the third camera of smallScenario(), whose output is enabled and has handlers. The
+// recorded data can be read on any thread; handlers run on the phone's threads.
 class StreamUser {
  public:
   struct Frame {
-    std::chrono::nanoseconds arrived{0};  // by the phone's clock
+    std::chrono::nanoseconds arrived{0};  // on the phone's clock
     MediaTime time;
     std::optional<Value> metadata;
   };
@@ -64,7 +64,7 @@ class StreamUser {
     const std::lock_guard lock(mutex_);
     return events_;
   }
-  // The frames' numbers from 0, by their presentation times at 30 frames per second.
+  // The numbers of the frames, from 0, derived from their presentation times at 30 frames per second.
   std::vector<std::uint64_t> numbers() const {
     std::vector<std::uint64_t> numbers;
     for (const Frame& frame : frames()) numbers.push_back(numberOf(frame.time));
@@ -76,7 +76,7 @@ class StreamUser {
     for (const Frame& frame : frames()) texts.push_back(defaultText(frame.metadata));
     return texts;
   }
-  // The buffers of `keep`, each with a reference of ours.
+  // The buffers of the frames in `keep`, each with an additional reference.
   std::vector<PixelBuffer*> kept() const {
     const std::lock_guard lock(mutex_);
     return kept_;
@@ -85,7 +85,8 @@ class StreamUser {
   void forgetHandlers() { frameHandler_ = nullptr; }
 
   PhoneUser user;
-  // To be set while no frame comes: the numbers of frames whose buffers are kept; what a handler does besides.
+  // Set these while no frame arrives: the numbers of frames whose buffers are kept, and an additional action of the
+  // handlers.
   std::set<std::uint64_t> keep;
   std::function<void()> onFrame;
 
@@ -108,7 +109,7 @@ class StreamUser {
 
   const std::shared_ptr<Clock> clock_;
   std::shared_ptr<PixelBufferHandler> frameHandler_;
-  mutable std::mutex mutex_;  // guards what follows
+  mutable std::mutex mutex_;  // guards the members below
   std::vector<Frame> frames_;
   std::vector<Event> events_;
   std::vector<PixelBuffer*> kept_;

@@ -10,8 +10,8 @@
 
 namespace quazor {
 
-// The scenario's channels, in its order. Counts wrap at 64 bits, and grow with the time during which any of the phone's
-// streams runs. Differences are those of makeCounterReports(). `hardware` must not be null.
+// The scenario's channels, in order. Counts wrap at 64 bits and grow only while a stream of the phone runs. Differences
+// are those of makeCounterReports(). `hardware` must not be null.
 //
 // Thread: any.
 std::shared_ptr<ReportFacility> makeSimulatedReports(std::vector<ReportChannelConfig> channels,

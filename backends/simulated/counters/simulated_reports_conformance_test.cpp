@@ -12,7 +12,7 @@
 namespace quazor {
 namespace {
 
-// Channels that step once a stream has run for a millisecond.
+// The channels change once, after a stream has run for a millisecond.
 class SimulatedCountersUnderTest {
  public:
   void make(const std::vector<ConformanceChannel>& channels) {

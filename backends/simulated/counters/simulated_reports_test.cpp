@@ -21,12 +21,12 @@ using ::testing::IsEmpty;
 
 ReportChannelConfig channel(const char* group, const char* subGroup, const char* name,
                             std::optional<std::uint64_t> count) {
-  ReportChannelConfig traits;
-  traits.group = group;
-  traits.subGroup = subGroup;
-  traits.name = name;
-  traits.count = count;
-  return traits;
+  ReportChannelConfig config;
+  config.group = group;
+  config.subGroup = subGroup;
+  config.name = name;
+  config.count = count;
+  return config;
 }
 
 class SimulatedReportsTest : public ::testing::Test {
@@ -57,7 +57,7 @@ class SimulatedReportsTest : public ::testing::Test {
     }
     return texts;
   }
-  // The counts alone.
+  // Only the counts.
   static std::vector<std::string> counts(const Snapshot& snapshot) {
     std::vector<std::string> counts;
     for (const ReportSample& sample : snapshot->samples()) counts.push_back(defaultText(sample.channel().count()));

@@ -8,7 +8,7 @@
 
 namespace quazor {
 
-// The scenario's main display, which never changes.
+// The scenario's main display. Its state never changes.
 // Thread: any.
 class SimulatedFramebufferService final : public FramebufferService {
  public:

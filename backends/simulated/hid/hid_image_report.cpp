@@ -15,7 +15,7 @@ constexpr std::size_t kFirstBlock = 16;
 constexpr std::size_t kSecondBlock = 400;
 constexpr std::size_t kTemperature = 788;
 constexpr std::size_t kSamples = 48;
-constexpr std::size_t kQ = 4 * kSamples;  // in a block, behind the I samples
+constexpr std::size_t kQ = 4 * kSamples;  // offset in a block, after the I samples
 constexpr std::uint8_t kReserved = 0xA5;
 
 void write32(Bytes& bytes, std::size_t at, std::uint32_t value) {

@@ -1,4 +1,4 @@
-// HidInbox: the inputs of a simulated device for one of its users.
+// HidInbox: the pending inputs of a simulated device for one user.
 #pragma once
 
 #include "backends/hid/hid_input_delivery.h"
@@ -9,12 +9,12 @@
 
 namespace quazor {
 
-// Inputs wait here until a loop on which the device is scheduled handles them, in the order in which they came. Not
-// more than kDepth reports do: newer ones are lost then. Reports are also lost while the device is scheduled nowhere,
-// and those that wait when it comes to that. Errors are lost only when the inbox is or gets closed, so a user who
-// schedules a device that has been removed is told.
+// Inputs wait here in order until a loop on which the device is scheduled handles them. At most kDepth reports can
+// wait; newer ones are lost. Reports are also lost while the device is not scheduled, and pending ones when it is
+// unscheduled everywhere. Errors are lost only if the inbox is closed, so a user who schedules a removed device is
+// informed.
 //
-// Thread: take() any; all else as HidInputDelivery.
+// Thread: any for take(); as HidInputDelivery for all other functions.
 class HidInbox final : public HidInputDelivery {
  public:
   static constexpr std::size_t kDepth = 64;

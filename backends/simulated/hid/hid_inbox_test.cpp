@@ -20,7 +20,7 @@ using ::testing::ElementsAre;
 using ::testing::IsEmpty;
 using ::testing::SizeIs;
 
-// An inbox on a loop in virtual time. Reports are told by their ID, errors as -1.
+// An inbox on a loop in virtual time. Reports are recorded by their ID, errors as -1.
 class HidInboxTest : public ::testing::Test {
  protected:
   HidInboxTest() { inbox_->setReceiver(receiver()); }
@@ -86,7 +86,7 @@ TEST_F(HidInboxTest, ALoopThatDoesNotRunLosesReportsButNoErrors) {
 TEST_F(HidInboxTest, AReceiverThatMakesMoreComeDoesNotOutlastTheLimit) {
   inbox_->open();
   schedule();
-  onInput_ = [this] { take(1); };  // without end
+  onInput_ = [this] { take(1); };  // endless
   take(1);
   EXPECT_EQ(run(), RunLoopResult::kTimedOut);
   EXPECT_THAT(seen_, SizeIs(HidInbox::kMaxInARound));

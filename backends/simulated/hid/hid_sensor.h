@@ -1,4 +1,4 @@
-// HidSensor: one simulated HID device, which all its users share.
+// HidSensor: a simulated HID device, shared by all its users.
 #pragma once
 
 #include "backends/simulated/hid/hid_inbox.h"
@@ -18,22 +18,23 @@
 
 namespace quazor {
 
-// Sends input reports while somebody has it open and its feature reports are as the scenario wants them: the first one
-// period after both have come to hold, then at the scenario's rate, to every user who has it open. Settings stay when
-// it is closed. A device that is removed tells those who have it open by an error in a report's place.
+// Sends input reports while a user has the device open and its feature reports have the values that the scenario
+// requires: the first report one period after both conditions are met, the others at the scenario's rate, to every user
+// who has it open. Settings persist while it is closed. When the device is removed, those who have it open receive an
+// error instead of a report.
 //
-// Thread: any. Reports are made on a queue of its own.
+// Thread: any. Reports are generated on the device's own queue.
 class HidSensor final : public std::enable_shared_from_this<HidSensor> {
  public:
-  HidSensor(HidDeviceConfig traits, std::shared_ptr<Clock> clock, Concurrency& concurrency);
+  HidSensor(HidDeviceConfig config, std::shared_ptr<Clock> clock, Concurrency& concurrency);
   HidSensor(const HidSensor&) = delete;
   HidSensor& operator=(const HidSensor&) = delete;
 
-  const HidDeviceConfig& traits() const { return traits_; }
-  // Whether it is there and has all entries of one of the dictionaries.
+  const HidDeviceConfig& config() const { return config_; }
+  // True if the device is present and matches all entries of one of the dictionaries.
   bool matches(const std::vector<Dictionary>& matching) const;
 
-  // Opens and closes it for the user whose inbox that is. Closing what is not open has no effect.
+  // Open and close the device for the user with that inbox. Closing a device that is not open has no effect.
   bool open(const std::shared_ptr<HidInbox>& user, DiagnosticErrorPtr* error);
   void close(const std::shared_ptr<HidInbox>& user);
   bool setFeature(const std::shared_ptr<HidInbox>& user, std::uint8_t reportID, std::span<const std::uint8_t> payload,
@@ -45,24 +46,24 @@ class HidSensor final : public std::enable_shared_from_this<HidSensor> {
   bool isToStream() const;
   void startOrStop();
   void arm();
-  void sendNext(std::uint64_t stretch);
+  void sendNext(std::uint64_t period);
   HidInput makeInput(std::uint64_t number);
 
-  const HidDeviceConfig traits_;
+  const HidDeviceConfig config_;
   const std::shared_ptr<Clock> clock_;
   const std::shared_ptr<SerialQueue> queue_;
 
-  mutable std::mutex mutex_;  // guards what follows
+  mutable std::mutex mutex_;  // guards the members below
   bool gone_ = false;
-  std::vector<std::shared_ptr<HidInbox>> users_;  // who has it open
-  std::map<std::uint8_t, std::uint8_t> values_;   // of the feature reports
+  std::vector<std::shared_ptr<HidInbox>> users_;  // those who have it open
+  std::map<std::uint8_t, std::uint8_t> values_;   // by feature report
   std::uint64_t nextReport_ = 0;
 
-  // Streaming without a break is a stretch; tasks of an earlier one do nothing.
+  // Identifies a period of uninterrupted streaming; tasks of an earlier period do nothing.
   bool streaming_ = false;
-  std::uint64_t stretch_ = 0;
-  std::chrono::nanoseconds stretchStart_{0};
-  std::uint64_t sentInStretch_ = 0;
+  std::uint64_t period_ = 0;
+  std::chrono::nanoseconds periodStart_{0};
+  std::uint64_t sentInPeriod_ = 0;
 };
 
 }  // namespace quazor

@@ -125,7 +125,7 @@ TEST_F(HidSensorTest, FeatureReportsAreRefusedAsARealSensorWould) {
       {"a value that it does not take",
        0xAB,
        {0xAB, 2},
-       refusal(HidErrorCode::kRefusedReport, "Feature report 0xAB of sensor does not take the value 2.")},
+       refusal(HidErrorCode::kRefusedReport, "Feature report 0xAB of sensor does not accept the value 2.")},
       {"a report that it does not have",
        0x76,
        {0x76, 1},
@@ -149,7 +149,7 @@ TEST_F(HidSensorTest, FeatureReportsAreRefusedAsARealSensorWould) {
 TEST_F(HidSensorTest, ADeviceIsOpenedOnce) {
   make();
   EXPECT_EQ(opening(), "done");
-  EXPECT_EQ(opening(), refusal(HidErrorCode::kAlreadyOpen, "sensor is open already."));
+  EXPECT_EQ(opening(), refusal(HidErrorCode::kAlreadyOpen, "sensor is already open."));
   user_->device->close(0);
   user_->device->close(0);
   EXPECT_EQ(opening(), "done");
@@ -176,7 +176,7 @@ TEST_F(HidSensorTest, AStopAndAStartBeginAFreshPeriod) {
   ASSERT_TRUE(user_->set(0xAB, 0) && user_->set(0xAB, 1));
   user_->run(11ms);
   EXPECT_THAT(user_->times(), ElementsAre(10ms, 25ms));
-  ASSERT_TRUE(user_->set(0xAB, 1));  // nothing changes
+  ASSERT_TRUE(user_->set(0xAB, 1));  // same value as before
   user_->run(9ms);
   EXPECT_THAT(user_->times(), ElementsAre(10ms, 25ms, 35ms));
 }

@@ -1,4 +1,4 @@
-// A phone with a HID sensor, and a user of it who writes down what comes, for the tests of this folder.
+// A phone with a HID sensor and a user who records its inputs, for the tests of this folder.
 #pragma once
 
 #include "backends/simulated/scenario/hid_config.h"
@@ -24,8 +24,8 @@ namespace quazor {
 inline constexpr std::uint16_t kTestUsagePage = 0xFF00;
 inline constexpr std::uint16_t kTestUsage = 0x24;
 
-// "sensor", with 100 reports per second once feature report 0xAB has the value 1 and 0xAC the value 2. 0xAB takes 0 and
-// 1; 0xAC takes anything, and so does 0xAD, which does not matter.
+// "sensor", which sends 100 reports per second while feature report 0xAB has the value 1 and 0xAC the value 2. 0xAB
+// accepts 0 and 1; 0xAC accepts anything, and so does 0xAD, which has no effect.
 inline HidDeviceConfig testSensor() {
   HidDeviceConfig sensor;
   sensor.name = "sensor";
@@ -36,7 +36,7 @@ inline HidDeviceConfig testSensor() {
   return sensor;
 }
 
-// A phone with these sensors and nothing else.
+// A phone with only these sensors.
 inline Scenario sensorScenario(std::vector<HidDeviceConfig> sensors) {
   Scenario scenario;
   scenario.title = "A phone with sensors";
@@ -48,12 +48,12 @@ inline Dictionary matchingUsage(Value page, Value usage) {
   return {{std::string(kHidPrimaryUsagePage), std::move(page)}, {std::string(kHidPrimaryUsage), std::move(usage)}};
 }
 
-// An error of the devices as defaultText() tells it.
+// An error of the devices as formatted by defaultText().
 inline std::string refusal(HidErrorCode code, std::string_view message) {
   return formatMessage("%@ code %@: %@", SimulatedHidErrorDomain, static_cast<std::int64_t>(code), message);
 }
 
-// A user of a device. What comes can be read on any thread.
+// A user of a device. The recorded inputs can be read on any thread.
 class SensorUser {
  public:
   explicit SensorUser(Platform platform, std::size_t index = 0)
@@ -77,7 +77,7 @@ class SensorUser {
   }
   void schedule() { device->scheduleWithRunLoop(loop_, kRunLoopDefaultMode); }
   void unschedule() { device->unscheduleFromRunLoop(loop_, kRunLoopDefaultMode); }
-  // All that it takes to get images.
+  // Performs all steps that are required to receive images.
   bool start() {
     const bool started = device->open(nullptr) && set(0xAB, 1) && set(0xAC, 2);
     schedule();
@@ -86,19 +86,19 @@ class SensorUser {
   RunLoopResult run(std::chrono::nanoseconds limit) { return loop_.runInMode(kRunLoopDefaultMode, limit, false); }
   RunLoop& loop() { return loop_; }
 
-  // "0x76 frame 1, 792 bytes", "0x76, 3 bytes" of what is too short to have a frame ID, or an error's text.
+  // "0x76 frame 1, 792 bytes"; "0x76, 3 bytes" if the report is too short for a frame ID; or an error's text.
   std::vector<std::string> seen() const {
     const std::lock_guard lock(mutex_);
     return seen_;
   }
-  // When each of them came, by the phone's clock.
+  // The arrival time of each input, on the phone's clock.
   std::vector<std::chrono::nanoseconds> times() const {
     const std::lock_guard lock(mutex_);
     return times_;
   }
 
   std::shared_ptr<HidDevice> device;
-  std::function<void()> onInput;  // what the receiver does besides
+  std::function<void()> onInput;  // an additional action of the receiver
 
  private:
   void write(std::uint8_t id, std::span<const std::uint8_t> data, const DiagnosticErrorPtr& error) {
@@ -122,7 +122,7 @@ class SensorUser {
 
   const Platform platform_;
   RunLoop& loop_;
-  mutable std::mutex mutex_;  // guards what follows
+  mutable std::mutex mutex_;  // guards the members below
   std::vector<std::string> seen_;
   std::vector<std::chrono::nanoseconds> times_;
 };

@@ -15,11 +15,11 @@ class SimulatedHidService::Device final : public HidDevice {
     inbox_->retire();
   }
 
-  const std::string& name() const { return sensor_->traits().name; }
+  const std::string& name() const { return sensor_->config().name; }
 
   std::string description() const override {
-    return formatMessage("HID device %@ (usage page %@, usage %@)", sensor_->traits().name, sensor_->traits().usagePage,
-                         sensor_->traits().usage);
+    return formatMessage("HID device %@ (usage page %@, usage %@)", sensor_->config().name, sensor_->config().usagePage,
+                         sensor_->config().usage);
   }
 
   bool open(DiagnosticErrorPtr* error) override { return sensor_->open(inbox_, error); }

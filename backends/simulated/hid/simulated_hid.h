@@ -13,18 +13,18 @@
 
 namespace quazor {
 
-// The scenario's devices, in its order. Every enumeration makes device objects of its own; what they are set to, and
-// the count of the reports, is the device's and common to all.
+// The scenario's devices, in order. Every enumeration creates new device objects; settings and the report count belong
+// to the device and are shared by its objects.
 //
-// Thread: any; a device object as platform/hid.h says. Device objects may be closed, unscheduled and destroyed at any
-// moment, by their receivers too.
+// Thread: any; device objects have the rules of platform/hid.h. Device objects may be closed, unscheduled and destroyed
+// at any time, even by their receivers.
 class SimulatedHidService final : public HidService {
  public:
   SimulatedHidService(const std::vector<HidDeviceConfig>& devices, const std::shared_ptr<Clock>& clock,
                       Concurrency& concurrency);
 
   std::shared_ptr<HidManager> createManager() override;
-  // The scenario's name of a device of such a service; empty for any other device.
+  // The scenario's name for a device of such a service; empty for any other device.
   static std::string nameOf(const HidDevice& device);
 
  private:

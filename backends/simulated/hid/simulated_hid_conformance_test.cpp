@@ -13,7 +13,7 @@
 namespace quazor {
 namespace {
 
-// Sensors that send a hundred reports per second while they are open, in virtual time.
+// Sensors that send 100 reports per second while they are open, in virtual time.
 class SimulatedHidUnderTest {
  public:
   SimulatedHidUnderTest() { connect({}, {}); }
@@ -40,7 +40,7 @@ class SimulatedHidUnderTest {
     phone_.emplace(sensorScenario(std::move(sensors)), PhoneTime::kVirtual, 1);
   }
   std::shared_ptr<HidManager> manager() { return phone_->platform().hid->createManager(); }
-  // A moment more than the time between reports, so that what is due then has come.
+  // Waits slightly longer than the reports need.
   void arrive(int count) {
     phone_->platform().clock->sleep(count * std::chrono::milliseconds(10) + std::chrono::microseconds(1));
   }

@@ -89,7 +89,7 @@ TEST_F(SimulatedHidTest, FaultsReachEveryOperation) {
   phone_->addFault(fault("*", FaultAction::kNothing));
   const std::array<std::uint8_t, 2> payload{0xAB, 0x01};
   EXPECT_EQ(platform.hid->createManager(), nullptr);
-  manager->enumerateDevicesMatching({});  // does nothing: what was found stays
+  manager->enumerateDevicesMatching({});  // has no effect: the found devices remain
   EXPECT_THAT(manager->devices(), IsEmpty());
   EXPECT_FALSE(device->open(nullptr));
   device->setInputReportCallback([](auto...) {});
@@ -104,8 +104,8 @@ TEST_F(SimulatedHidTest, FaultsReachEveryOperation) {
 TEST_F(SimulatedHidTest, OperationsWithoutAnAnswerHaveNoEffectWhereAFaultMakesThemFail) {
   const struct {
     std::string_view operation;
-    std::size_t images;    // that come in 55 ms; when everything is ended then, there are no more
-    RunLoopResult result;  // of a run after that
+    std::size_t images;    // images received in 55 ms; afterwards everything is stopped
+    RunLoopResult result;  // of a later run
   } kRows[] = {
       {sensor_operation::kSetCallback, 0, RunLoopResult::kFinished},
       {sensor_operation::kSchedule, 0, RunLoopResult::kFinished},

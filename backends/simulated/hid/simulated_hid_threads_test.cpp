@@ -1,4 +1,4 @@
-// The sensors in real time: reports are made on one thread and received on another.
+// The sensors in real time: reports are generated on one thread and received on another.
 #include "backends/simulated/hid/sensor_user_for_tests.h"
 #include "backends/simulated/simulated_phone.h"
 
@@ -71,7 +71,7 @@ TEST(SimulatedHidOnThreadsTest, DevicesMayBeDestroyedWhileReportsCome) {
   }
 }
 
-// The thread, and with it the loop, ends as soon as the device is unscheduled, while reports still come.
+// The thread and its loop end as soon as the device is unscheduled, while reports are still sent.
 TEST(SimulatedHidOnThreadsTest, ALoopMayEndOnceTheDeviceIsUnscheduled) {
   const SimulatedPhone phone(sensorScenario({fastSensor()}), PhoneTime::kReal, 0);
   SensorUser keeper(phone.platform());  // keeps the sensor streaming

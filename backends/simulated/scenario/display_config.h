@@ -1,4 +1,4 @@
-// What a scenario says of the main display.
+// The main display in a scenario.
 #pragma once
 
 #include "contract/value.h"
@@ -7,8 +7,8 @@ namespace quazor {
 
 struct DisplayConfig {
   bool present = true;          // false: the phone has no main display
-  bool registryService = true;  // false: the display's driver has no entry in the registry
-  Dictionary properties;        // of that entry
+  bool registryService = true;  // false: the display's driver has no registry entry
+  Dictionary properties;        // of the registry entry
 };
 
 }  // namespace quazor

@@ -1,4 +1,4 @@
-// What a scenario says of a report channel.
+// The report channels in a scenario.
 #pragma once
 
 #include <chrono>
@@ -9,9 +9,9 @@
 
 namespace quazor {
 
-// At some moment a channel counts on.
+// A single increment of a channel.
 struct ReportStep {
-  std::chrono::nanoseconds at{0};  // of streaming: only the time counts during which any stream runs
+  std::chrono::nanoseconds at{0};  // streaming time, which passes only while a stream runs
   std::uint64_t by = 0;
 };
 
@@ -19,8 +19,8 @@ struct ReportChannelConfig {
   std::string group;
   std::string subGroup;
   std::string name;
-  std::optional<std::uint64_t> count = 0;  // when the phone is made; nothing: the channel has no simple count
-  std::uint64_t growth = 0;                // per second of streaming
+  std::optional<std::uint64_t> count = 0;  // initial value; nothing: the channel has no simple count
+  std::uint64_t growth = 0;                // per second of streaming time
   std::vector<ReportStep> steps;
 };
 

@@ -12,7 +12,7 @@ inline constexpr std::string_view SimulatedReportErrorDomain = "SimulatedReportE
 
 // The codes of the domain.
 enum class ReportErrorCode : std::int64_t {
-  kInjected = 1,        // a fault of the scenario asked for a failure and gave no error of its own
+  kInjected = 1,        // a fault of the scenario requested a failure and gave no error of its own
   kForeignBaseline = 2  // the baseline is a snapshot of other channels
 };
 

@@ -1,4 +1,4 @@
-// Scenario: a whole simulated phone, as data. data/scenarios/scenario.schema.json describes the files.
+// Scenario: a complete simulated phone as data. data/scenarios/scenario.schema.json describes the files.
 #pragma once
 
 #include "backends/faults/fault.h"
@@ -20,7 +20,7 @@ namespace quazor {
 
 class JsonDocument;
 
-// Frame rates, in frames per second, are kept to a millionth and are at most this.
+// The maximum frame rate, in frames per second. Rates have a resolution of a millionth.
 inline constexpr double kMaxFrameRate = 1000;
 
 struct CameraFormat {
@@ -28,37 +28,37 @@ struct CameraFormat {
 };
 
 struct Camera {
-  std::string id;    // names the camera in the scenario and in faults
+  std::string id;    // the name of the camera in the scenario and in faults
   std::string port;  // its port type (platform/capture_keys.h)
   std::vector<CameraFormat> formats;
-  bool multipleOutputs = true;  // takes MultipleOutputSupportEnabled
+  bool multipleOutputs = true;  // supports MultipleOutputSupportEnabled
 
-  // Streaming. Frame numbers count from 0, the first that the camera could deliver.
-  std::uint64_t firstFrameOffset = 0;     // frames of the master before the camera's first, when all start as one
-  std::optional<double> actualFrameRate;  // instead of the one that was set
-  bool deliversFrames = true;             // false: runs, and no frame comes
-  std::set<std::uint64_t> droppedFrames;  // the numbers of frames that are lost
+  // Streaming. Frames are numbered from 0, the first one that the camera could deliver.
+  std::uint64_t firstFrameOffset = 0;     // frames of the master before the camera's first, in a synchronised start
+  std::optional<double> actualFrameRate;  // overrides the rate that was set
+  bool deliversFrames = true;             // false: the stream runs without frames
+  std::set<std::uint64_t> droppedFrames;  // the numbers of lost frames
   std::uint64_t dropEvery = 0;            // every nth frame is lost; 0: none
-  bool inSessionStatus = true;            // false: the session's status leaves the camera out
+  bool inSessionStatus = true;            // false: the session's status omits the camera
   std::optional<Dictionary> errorCounters = defaultErrorCounters();  // nothing: cannot be read
-  Dictionary errorCounterGrowth;       // errors per second of the stream's present or last stretch, by counter
+  Dictionary errorCounterGrowth;       // errors per second in the latest run of the stream, by counter
   std::optional<Projector> projector;  // nothing: the camera has none
   DeliveryConfig delivery;
 
-  // All of the counters that the hardware has, at 0.
+  // All counters of the hardware, at 0.
   static Dictionary defaultErrorCounters();
 };
 
-// Cameras that can run as one synchronised session.
+// Cameras that can run in one synchronised session.
 struct CameraGroup {
   std::string id;
-  std::vector<std::string> cameras;  // ids, in the group's order
-  std::string master;                // the id of one of them
+  std::vector<std::string> cameras;  // ids, in order
+  std::string master;                // the id of one of the cameras
   bool masterConfiguration = true;   // supports SlaveConfigurationByPortType in MasterConfiguration
 };
 
 struct CaptureDeviceConfig {
-  bool plugInLoads = true;  // false: no capture plug-in can be made
+  bool plugInLoads = true;  // false: creating a capture plug-in fails
   bool present = true;      // false: the plug-in finds no device
 };
 
@@ -71,14 +71,14 @@ struct Scenario {
   std::vector<HidDeviceConfig> hidDevices;
   DisplayConfig display;
   std::vector<Fault> faults;
-  // The file's document, with its base merged in, for the key that no phone reads: `expect`, what runs should end in.
-  // Null for a scenario that is in no file.
+  // The document of the file after its base was merged in. The host reads the key `expect` from it, the expected
+  // outcome of runs, which the phone ignores. Null if the scenario is not from a file.
   std::shared_ptr<const JsonDocument> document;
 };
 
-// Reads a scenario file and the files it is based on. Throws InputError, one sentence without a line end: the
-// file, the line where it is the file's own, the JSON path of a wrong value, what is wrong and what would be right. Any
-// thread.
+// Reads a scenario file and the files that it is based on. Throws InputError: one sentence without a line end that
+// contains the file, the line if it is in this file, the JSON path of the invalid value, the problem and the
+// expectation. Thread: any.
 Scenario readScenario(const std::filesystem::path& file);
 
 }  // namespace quazor

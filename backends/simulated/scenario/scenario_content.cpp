@@ -26,7 +26,7 @@ bool booleanOr(const JsonCursor& object, std::string_view key, bool otherwise) {
   return entry ? entry->boolean() : otherwise;
 }
 
-// Ids stand in paths, lists and on command lines.
+// Ids are used in paths, lists and command lines.
 void checkId(const std::string& id, const JsonCursor& cursor) {
   const auto fits = [](char c) {
     return (c >= 'a' && c <= 'z') || (c >= 'A' && c <= 'Z') || (c >= '0' && c <= '9') || c == '-' || c == '_';

@@ -1,4 +1,4 @@
-// From a scenario's document to the scenario.
+// Converts a scenario's document to a scenario.
 #pragma once
 
 #include "backends/simulated/scenario/scenario.h"
@@ -6,8 +6,7 @@
 
 namespace quazor {
 
-// The scenario that a document describes, its "base" already merged in; its `expect` is not read. Throws InputError,
-// "PATH: ...".
+// The scenario in a document whose "base" has been merged in; ignores `expect`. Throws InputError: "PATH: ...".
 Scenario scenarioOf(const JsonCursor& document);
 
 }  // namespace quazor

@@ -15,7 +15,7 @@ using ::testing::IsEmpty;
 using ::testing::SizeIs;
 using Json = nlohmann::ordered_json;
 
-// A phone withEntry two sensors and a display, and one more entry.
+// A phone with two sensors, a display and one more entry.
 std::string withEntry(std::string_view entry) {
   return R"({"title": "t", "cameras": {}, "groups": {},
              "hidDevices": {"near": {"usagePage": 1, "usage": 2, "featureReports": {"0xAB": {}, "0x01": {}}},

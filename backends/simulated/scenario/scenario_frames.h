@@ -1,4 +1,4 @@
-// The parts of a scenario's document that describe frames and report channels.
+// Reads the frames and report channels of a scenario's document.
 #pragma once
 
 #include "backends/simulated/scenario/frame_config.h"
@@ -9,12 +9,12 @@
 
 namespace quazor {
 
-// All throw InputError, "PATH: ...".
+// All of these throw InputError: "PATH: ...".
 Projector readProjector(const JsonCursor& cursor);
 DeliveryConfig readDelivery(const JsonCursor& cursor);
-// Errors per second of streaming, by counter; unsigned integers.
+// Errors per second of streaming time by counter, as unsigned integers.
 Dictionary readErrorCounterGrowth(const JsonCursor& cursor);
-// Groups of subgroups of channels.
+// Reads groups of subgroups of channels.
 std::vector<ReportChannelConfig> readReports(const JsonCursor& cursor);
 
 }  // namespace quazor

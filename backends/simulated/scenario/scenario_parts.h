@@ -1,4 +1,4 @@
-// What several parts of a scenario's document are made of.
+// Helper functions for reading a scenario's document.
 #pragma once
 
 #include "base/json/json_cursor.h"
@@ -8,8 +8,8 @@
 
 namespace quazor {
 
-// The key of an entry that is a number from 0 to `highest`; `what` says of what: "a frame". `entry` is its value.
-// Throws InputError, "PATH: ...".
+// Parses a key that is a number from 0 to `highest`; `what` is the noun for messages, for example "a frame". `entry` is
+// the key's value. Throws InputError: "PATH: ...".
 std::uint64_t readNumberKey(const std::string& key, const std::string& what, std::uint64_t highest,
                             const JsonCursor& entry);
 

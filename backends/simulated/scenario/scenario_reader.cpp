@@ -14,8 +14,8 @@ namespace {
 using Json = nlohmann::ordered_json;
 namespace fs = std::filesystem;
 
-// One file and its bases. A base is a whole scenario itself, so that what is wrong with it is found there and not in
-// the files that build on it. `open_` are the files on the way here; none of them may be a base again.
+// Reads one file and its bases. A base must be a complete scenario by itself, so its errors are reported for the base
+// and not for the files that use it. `open_` are the files being read; none of them may be a base again.
 //
 // Thread: one at a time
 class Loader {

@@ -24,7 +24,7 @@ namespace fs = std::filesystem;
 using ::testing::ElementsAre;
 using ::testing::IsEmpty;
 
-// A folder of its own for every test.
+// Each test has its own directory.
 class ScenarioReaderTest : public ::testing::Test {
  protected:
   ScenarioReaderTest() {
@@ -42,7 +42,7 @@ class ScenarioReaderTest : public ::testing::Test {
     std::ofstream(file, std::ios::binary) << text;
     return file;
   }
-  // What is wrong with a file, without the folder's name; "nothing" when it was read.
+  // The error message for a file, without the directory; "nothing" if the file is valid.
   std::string problemOf(const fs::path& file) {
     std::string problem;
     try {
@@ -62,7 +62,7 @@ class ScenarioReaderTest : public ::testing::Test {
   fs::path folder_;
 };
 
-// A scenario with a camera "a" and a group "g" of it, and one more entry.
+// A scenario with a camera "a", a group "g" that contains it, and one more entry.
 std::string with(const std::string& entry) {
   return R"({"title": "t", "cameras": {"a": {"port": "BackFacingCamera", "formats": [{"maximumFrameRate": 30}]}},
              "groups": {"g": {"cameras": ["a"], "master": "a"}}, )" +
@@ -79,7 +79,7 @@ std::string withGroup(const std::string& group) {
 }
 std::string withFault(const std::string& entries) { return with(R"("faults": [{)" + entries + "}]"); }
 
-// What the scenario hands over unread.
+// The entry `expect`, which the scenario passes on unread.
 std::string expectIn(const Scenario& scenario) {
   return scenario.document->value().value("expect", nlohmann::ordered_json()).dump();
 }

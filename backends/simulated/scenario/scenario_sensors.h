@@ -1,4 +1,4 @@
-// The parts of a scenario's document that describe HID devices and the display.
+// Reads the HID devices and the display of a scenario's document.
 #pragma once
 
 #include "backends/simulated/scenario/display_config.h"
@@ -9,7 +9,7 @@
 
 namespace quazor {
 
-// Both throw InputError, "PATH: ...".
+// Both throw InputError: "PATH: ...".
 HidDeviceConfig readHidDevice(const std::string& name, const JsonCursor& cursor);
 DisplayConfig readDisplay(const JsonCursor& cursor);
 

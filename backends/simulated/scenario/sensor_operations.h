@@ -14,15 +14,15 @@ inline constexpr std::string_view SimulatedHidErrorDomain = "SimulatedHidErrorDo
 
 // The codes of the domain.
 enum class HidErrorCode : std::int64_t {
-  kInjected = 1,       // a fault of the scenario asked for a failure and gave no error of its own
+  kInjected = 1,       // a fault of the scenario requested a failure and gave no error of its own
   kAlreadyOpen = 2,    // the device is open
-  kNotOpen = 3,        // the device has to be opened first
+  kNotOpen = 3,        // the device must be opened first
   kGone = 4,           // the device has been removed from the phone
-  kUnknownReport = 5,  // the device has no feature report of that ID
-  kRefusedReport = 6   // the report is malformed, or its value is not one that the device takes
+  kUnknownReport = 5,  // the device has no feature report with that ID
+  kRefusedReport = 6   // the report is malformed or the device does not accept its value
 };
 
-// Tells a refusal: stores an error of the device where the caller asked for one, and is false.
+// Stores an error of the device unless `error` is null, and returns false.
 template <class... Arguments>
 bool refuse(DiagnosticErrorPtr* error, HidErrorCode code, MessageFormat<Arguments...> format,
             const Arguments&... arguments) {

@@ -21,9 +21,9 @@ namespace {
 constexpr std::size_t kGuardSize = std::size_t{64} * 1024;  // a multiple of every page size in use
 constexpr std::size_t kStackSize = std::size_t{512} * 1024;
 
-thread_local Fiber* entering = nullptr;  // makecontext hands integers only to the entry function
+thread_local Fiber* entering = nullptr;  // makecontext() passes only integers to the entry function
 
-// The sanitizers' calls; nothing in other builds.
+// Calls of the sanitizers; empty in other builds.
 void beginSwitch([[maybe_unused]] void** fakeStack, [[maybe_unused]] const void* stack,
                  [[maybe_unused]] std::size_t size, [[maybe_unused]] void* handle) {
 #ifdef QUAZOR_ADDRESS_SANITIZER
@@ -72,7 +72,7 @@ Fiber::Fiber(std::function<void()> body) : body_(std::move(body)) {
   void* memory = mmap(nullptr, kGuardSize + kStackSize, PROT_READ | PROT_WRITE, MAP_PRIVATE | MAP_ANONYMOUS, -1, 0);
   if (memory == MAP_FAILED) throw std::bad_alloc();
   memory_ = static_cast<std::byte*>(memory);
-  mprotect(memory_, kGuardSize, PROT_NONE);  // a stack that overflows ends the program instead of spoiling its memory
+  mprotect(memory_, kGuardSize, PROT_NONE);  // a stack overflow ends the program instead of corrupting its memory
   ownHandle_ = newHandle();
   getcontext(&own_);
   own_.uc_stack.ss_sp = memory_ + kGuardSize;
@@ -113,7 +113,7 @@ void Fiber::run() {
   }
 }
 
-// The layout is that of the Itanium C++ ABI, 2.2.2 "Caught exception stack".
+// The layout of the Itanium C++ ABI, 2.2.2 "Caught exception stack".
 Fiber::ExceptionState Fiber::exchangeExceptionState(const ExceptionState& state) {
   void* globals = abi::__cxa_get_globals();
   ExceptionState previous;

@@ -1,4 +1,4 @@
-// Fiber: a flow of execution with a stack of its own.
+// Fiber: a coroutine with its own stack.
 #pragma once
 
 #include <ucontext.h>
@@ -8,30 +8,30 @@
 
 namespace quazor {
 
-// Runs a body on its own stack, so that the body can stop in the middle and go on later while others run meanwhile.
-// A resumed fiber runs on the resumer's thread until it suspends itself or its body returns; then resume() returns.
+// Runs a body on its own stack; the body can suspend in the middle and continue later. A resumed fiber runs on the
+// resumer's thread until it suspends or its body returns; then resume() returns.
 //
-// Built on the context functions of POSIX.1-2001. Sanitizers are told of every switch, and each fiber has its own
-// state of exception handling, so that it may suspend in a handler.
+// Uses the context functions of POSIX.1-2001. Informs the sanitizers of every switch, and gives each fiber its own
+// exception state, so a fiber may suspend in an exception handler.
 //
 // Thread: one for all calls of a fiber.
 class Fiber final {
  public:
-  // Nothing runs before the first resume(). `body` must not throw; when it has returned, the next resume() begins it
-  // anew. Throws std::bad_alloc when there is no memory for the stack.
+  // Nothing runs before the first resume(). `body` must not throw; after it has returned, the next resume() starts it
+  // again. Throws std::bad_alloc if there is no memory for the stack.
   explicit Fiber(std::function<void()> body);
   Fiber(const Fiber&) = delete;
   Fiber& operator=(const Fiber&) = delete;
-  // REQUIRES: the body is not suspended in its middle; what is on its stack would never be destroyed.
+  // REQUIRES: the body is not suspended, because the objects on its stack would never be destroyed.
   ~Fiber();
 
   // REQUIRES: called from outside the fiber.
   void resume();
-  // Back to the resumer. REQUIRES: called by the body.
+  // Returns to the resumer. REQUIRES: called by the body.
   void suspend();
 
  private:
-  // What the C++ runtime keeps for each flow: the exceptions in its handlers, and how many are on their way.
+  // The C++ runtime's exception state: the caught exceptions and the number of uncaught ones.
   struct ExceptionState {
     void* caught = nullptr;
     unsigned uncaught = 0;
@@ -47,7 +47,7 @@ class Fiber final {
   ucontext_t resumer_{};
   ExceptionState exceptions_;
 
-  // For the sanitizers.
+  // Used by the sanitizers.
   void* ownFakeStack_ = nullptr;
   const void* resumerStack_ = nullptr;
   std::size_t resumerStackSize_ = 0;

@@ -69,7 +69,7 @@ TEST(Fiber, ThrowsAndCatchesOnItsOwnStack) {
   EXPECT_EQ(caught, "thrown inside");
 }
 
-// A handler's exception belongs to the flow that caught it, however the handlers of several flows overlap.
+// A caught exception belongs to the fiber that caught it, even if the handlers of several fibers overlap.
 TEST(Fiber, SuspendsInsideAHandlerWithoutDisturbingOthers) {
   const auto current = [] {
     try {

@@ -1,4 +1,4 @@
-// Chooser: decides which of several things that could happen now happens first.
+// ScheduleStrategy: decides which of several possible events happens first.
 #pragma once
 
 #include <cstddef>
@@ -6,8 +6,8 @@
 
 namespace quazor {
 
-// One chooser and one program give one order of events: what it answers is all that is left open in a simulated run.
-// A test hands in its own, say one that replays a list of choices, to steer a run into every order there is.
+// The strategy is the only source of nondeterminism in a simulated run: one strategy and one program give one order of
+// events. A test can supply its own, for example one that replays a list of choices, to produce every possible order.
 //
 // Thread: one at a time.
 class ScheduleStrategy {
@@ -17,11 +17,11 @@ class ScheduleStrategy {
   ScheduleStrategy& operator=(const ScheduleStrategy&) = delete;
   virtual ~ScheduleStrategy();
 
-  // Which of `count` things is next, from 0 to count - 1. Asked only when there is a choice: `count` is at least 2.
+  // Returns the index of the next event, from 0 to count - 1. Called only if there is a choice: `count` is at least 2.
   virtual std::size_t choose(std::size_t count) = 0;
 };
 
-// Chooses by a seeded generator (SplitMix64, Steele, Lea and Flood 2014), written out here so that a seed means the
+// Chooses with a seeded generator (SplitMix64, Steele, Lea and Flood 2014), implemented here so that a seed gives the
 // same order with every standard library.
 // Thread: one at a time.
 class RandomStrategy final : public ScheduleStrategy {

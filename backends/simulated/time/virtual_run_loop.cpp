@@ -15,7 +15,7 @@ class VirtualWaiter final : public RunLoopWaiter {
   void wait(std::chrono::nanoseconds deadline, const std::function<bool()>& ready) override {
     scheduler_->blockUntil(ready, deadline, "a run loop waits for what nothing will signal or stop");
   }
-  // The scheduler asks before every step.
+  // Does nothing: the scheduler checks the condition before every step.
   void wake() override {}
 
  private:

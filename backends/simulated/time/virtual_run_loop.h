@@ -9,18 +9,18 @@
 
 namespace quazor {
 
-// The main flow has a loop, and so has every lane of the scheduler, as if it were a thread: tasks of one lane get the
-// same loop. A run that waits blocks in the scheduler, so that all other tasks go on; it throws SimulationStall when
-// nothing is left that could end it, and nobody is told of the end of such a run.
+// The main flow has a loop, and so has every strand of the scheduler, like a thread: tasks of one strand share a loop.
+// A run that waits blocks in the scheduler, which runs all other tasks. If no event is left that could end it, it
+// throws SimulationStall without notifying observers.
 //
-// Thread: the scheduler's, for what it makes too; other tasks may do with a loop what other threads may.
+// Thread: the scheduler's, also for the loops; tasks of other strands may use a loop like other threads may.
 class VirtualRunLoops final : public RunLoops {
  public:
   // `scheduler` must not be null.
   explicit VirtualRunLoops(std::shared_ptr<VirtualScheduler> scheduler);
   ~VirtualRunLoops() override;
 
-  // Never null. The loop lives as long as this object; that of a lane may go when the lane has gone.
+  // Never null. The loop lives as long as this object; that of a strand may end with the strand.
   RunLoop* currentRunLoop() override;
 
  private:

@@ -44,10 +44,10 @@ class VirtualRunLoopTest : public ::testing::Test {
   std::shared_ptr<SerialQueue> makeQueue() {
     return VirtualConcurrency(scheduler_).makeSerialQueue("org.quazor.lane", QualityOfService::kDefault);
   }
-  // Until nothing is left to do at this moment.
+  // Runs until there is nothing left to do at the current time.
   void settle() { VirtualClock(scheduler_).sleep(1ns); }
 
-  int gone_ = 0;  // handlers, also those that go with their loops
+  int gone_ = 0;  // destroyed handlers, including those destroyed with their loops
   std::shared_ptr<VirtualScheduler> scheduler_ =
       std::make_shared<VirtualScheduler>(std::make_shared<RandomStrategy>(3));
   VirtualRunLoops loops_{scheduler_};
@@ -85,7 +85,7 @@ TEST_F(VirtualRunLoopTest, AWaitThatNothingCanEndIsAStallAndTheLoopCanBeRunAgain
                    kRunLoopDefaultMode);
   EXPECT_THROW(loop.runInMode(kRunLoopDefaultMode, std::chrono::nanoseconds::max(), false), SimulationStall);
   EXPECT_EQ(told, "");
-  loop.stop();  // no run is going on
+  loop.stop();  // without a run
   EXPECT_EQ(loop.runInMode(kRunLoopDefaultMode, 1s, false), RunLoopResult::kTimedOut);
   EXPECT_EQ(told, "exit ");
 }

@@ -16,12 +16,12 @@ class VirtualScheduler::Flow {
   Flow() : fiber_([this] { runTask(); }) {}
 
   void begin(std::shared_ptr<Strand> strand, Task task) {
-    lane_ = std::move(strand);
+    strand_ = std::move(strand);
     task_ = std::move(task);
   }
   // Runs until the task blocks or has ended.
   void resume() { fiber_.resume(); }
-  // Puts the task aside until it is resumed; throws when it is to end instead.
+  // Suspends the task until it is resumed; throws if it has been cancelled.
   void block(const Wait& wait, const VirtualScheduler& scheduler) {
     if (!cancelled_) {
       wait_ = &wait;
@@ -30,14 +30,14 @@ class VirtualScheduler::Flow {
     }
     if (cancelled_) scheduler.stall(wait.what);
   }
-  // From here on every blocking call of the task throws.
+  // Makes every later blocking call of the task throw.
   void cancel() { cancelled_ = true; }
 
-  // The call that the task is blocked in; null when it has ended.
+  // The blocking call of the task; null after its end.
   const Wait* wait() const { return wait_; }
-  const std::shared_ptr<Strand>& strand() const { return lane_; }
-  // Of a task that has ended: its lane, and what it threw, if it did.
-  std::shared_ptr<Strand> takeLane() { return std::exchange(lane_, nullptr); }
+  const std::shared_ptr<Strand>& strand() const { return strand_; }
+  // For a task that has ended: its strand, and its exception or null.
+  std::shared_ptr<Strand> takeStrand() { return std::exchange(strand_, nullptr); }
   std::exception_ptr takeFailure() { return std::exchange(failure_, nullptr); }
   bool cancelled() const { return cancelled_; }
 
@@ -51,7 +51,7 @@ class VirtualScheduler::Flow {
     task_.reset();
   }
 
-  std::shared_ptr<Strand> lane_;
+  std::shared_ptr<Strand> strand_;
   Task task_;
   const Wait* wait_ = nullptr;
   bool cancelled_ = false;
@@ -88,7 +88,7 @@ void VirtualScheduler::submitAt(std::chrono::nanoseconds due, const std::shared_
 }
 
 void VirtualScheduler::dropDelayed(const Strand& strand) {
-  std::vector<Task> dropped;  // destroyed at the end: a task's destructor may call back into the scheduler
+  std::vector<Task> dropped;  // destroyed last, because a task's destructor may call the scheduler
   for (auto entry = delayed_.begin(); entry != delayed_.end();) {
     if (entry->second.strand.get() == &strand) {
       dropped.push_back(std::move(entry->second.task));
@@ -132,7 +132,7 @@ void VirtualScheduler::blockUntil(const std::function<bool()>& condition, std::c
 void VirtualScheduler::stall(std::string_view what) const {
   const double seconds = static_cast<double>(now_.count()) / 1e9;
   throw SimulationStall(
-      formatMessage("The simulated phone waits for ever: %@, at %@ s of virtual time.", what, seconds));
+      formatMessage("The simulated phone waits forever: %@, at %@ s of virtual time.", what, seconds));
 }
 
 void VirtualScheduler::block(const Wait& wait) {
@@ -146,7 +146,7 @@ void VirtualScheduler::block(const Wait& wait) {
 void VirtualScheduler::runUntilReady(const Wait& wait) {
   constexpr std::size_t kMainFlow = static_cast<std::size_t>(-1);
   for (;;) {
-    std::vector<std::size_t> ready;  // kMainFlow, or a position in blocked_
+    std::vector<std::size_t> ready;  // kMainFlow, or an index of blocked_
     if (wait.condition()) ready.push_back(kMainFlow);
     for (std::size_t i = 0; i < blocked_.size(); ++i) {
       if (blocked_[i]->wait()->condition()) ready.push_back(i);
@@ -181,7 +181,7 @@ std::chrono::nanoseconds VirtualScheduler::nextDue(std::chrono::nanoseconds due)
 std::size_t VirtualScheduler::choose(std::size_t count) {
   if (count == 1) return 0;
   const std::size_t choice = chooser_->choose(count);
-  if (choice >= count) throw std::out_of_range("A chooser chose what there is not.");
+  if (choice >= count) throw std::out_of_range("The schedule strategy chose an event that does not exist.");
   return choice;
 }
 
@@ -210,11 +210,11 @@ void VirtualScheduler::resume(std::unique_ptr<Flow> flow) {
     blocked_.push_back(std::move(flow));
     return;
   }
-  const std::shared_ptr<Strand> strand = flow->takeLane();
+  const std::shared_ptr<Strand> strand = flow->takeStrand();
   strand->running = false;
   if (!strand->due.empty()) runnable_.push_back(strand);
   const std::exception_ptr failure = flow->takeFailure();
-  if (flow->cancelled()) return;  // it threw because it was told to
+  if (flow->cancelled()) return;  // the exception was caused by cancel()
   idle_.push_back(std::move(flow));
   if (failure != nullptr) std::rethrow_exception(failure);
 }

@@ -17,69 +17,69 @@
 
 namespace quazor {
 
-// Everything that happens on a simulated phone is a task of one scheduler. Tasks stand in lanes: the tasks of one lane
-// run one at a time, in the order in which they became due; between lanes there is no order.
+// Everything that happens on a simulated phone is a task of one scheduler. Tasks are grouped in strands: the tasks of a
+// strand run one at a time, in the order in which they became due; tasks of different strands are unordered.
 //
-// Nothing runs by itself. When the main flow, which is whoever is not in a task, makes a blocking call, tasks run until
-// what it waits for has come. A task may block as well: it is put aside, on its own stack, its lane waits for it, and
-// everything else goes on. Whenever more than one thing can happen (the main flow goes on, a task that blocked goes
-// on, a lane runs its next task), the Chooser picks. Time stands still while there is anything to do and then jumps
-// to the next due time.
+// Tasks run only during blocking calls. When the main flow, which is the code outside of tasks, makes a blocking call,
+// tasks run until its condition is met. A task may also block: it is suspended on its own stack, its strand waits for
+// it, and everything else continues. Whenever several events are possible (the main flow continues, a blocked task
+// continues, a strand runs its next task), the ScheduleStrategy picks one. Time stands still while anything can run and
+// then advances to the next due time.
 //
-// All this is one thread, so a lock that a task holds while it blocks does not keep other tasks out or, where it is not
-// recursive, blocks the whole simulation.
+// All of this is one thread, so a lock that a task holds while it blocks does not exclude other tasks or, if it is not
+// recursive, deadlocks the whole simulation.
 //
 // Thread: all calls on one thread.
 class VirtualScheduler final {
  public:
-  // Due times that do not fit the clock become this one; it never comes.
+  // Represents all due times beyond the range of the clock; it is never reached.
   static constexpr std::chrono::nanoseconds kNever = std::chrono::nanoseconds::max();
 
-  // A sequence of tasks that never overlap. Made by makeStrand; it lives as long as it is held or has tasks.
+  // A sequence of tasks that never overlap. Created by makeStrand(); it lives while it is referenced or has tasks.
   class Strand {
    private:
     friend class VirtualScheduler;
-    std::deque<Task> due;  // waiting to run, in order
-    bool running = false;  // one of its tasks has begun and not ended
+    std::deque<Task> due;  // ready to run, in order
+    bool running = false;  // one of its tasks has started and not ended
   };
 
   // `chooser` must not be null.
   explicit VirtualScheduler(std::shared_ptr<ScheduleStrategy> chooser);
   VirtualScheduler(const VirtualScheduler&) = delete;
   VirtualScheduler& operator=(const VirtualScheduler&) = delete;
-  // As discardPending().
+  // Calls discardPending().
   ~VirtualScheduler();
 
-  // Virtual time since the scheduler was made.
+  // The virtual time since the scheduler was created.
   std::chrono::nanoseconds now() const { return now_; }
-  // The moment `delay` from now: now for zero and less, kNever beyond the clock's range.
+  // The time `delay` from now: now if it is not positive, kNever beyond the range of the clock.
   std::chrono::nanoseconds after(std::chrono::nanoseconds delay) const;
 
   std::shared_ptr<Strand> makeStrand();
-  // The lane of the task that is executing; null when it is the main flow.
+  // The strand of the running task; null in the main flow.
   std::shared_ptr<Strand> currentStrand() const;
-  // Adds a task at the end of the lane.
+  // Appends a task to the strand.
   void submit(const std::shared_ptr<Strand>& strand, Task task);
-  // Adds the task when its time has come, behind those that are waiting then; at once when it has come already.
+  // Appends the task when it becomes due, after those that are ready then; at once if it is already due.
   void submitAt(std::chrono::nanoseconds due, const std::shared_ptr<Strand>& strand, Task task);
-  // Destroys the lane's tasks whose time has not come.
+  // Destroys the tasks of the strand that are not yet due.
   void dropDelayed(const Strand& strand);
-  // Destroys all pending tasks, and those that their destruction submits; a task that has begun and blocks gets a
-  // SimulationStall out of its blocking call. Breaks the circle of a pending task that holds an object that holds the
-  // scheduler. The scheduler goes on working.
+  // Destroys all pending tasks, and those that their destructors submit. Blocked tasks receive a SimulationStall from
+  // their blocking call. Breaks reference cycles between the scheduler and objects that pending tasks hold. The
+  // scheduler remains usable.
   void discardPending();
 
-  // Blocks until `due` has come. `what` names the wait in a stall.
-  // Throws SimulationStall when it would never come. On the main flow, also throws whatever a task throws.
+  // Blocks until `due`. `what` describes the wait in a SimulationStall, which is thrown if `due` would never be
+  // reached. In the main flow, also rethrows the exceptions of tasks.
   void blockUntil(std::chrono::nanoseconds due, std::string_view what);
-  // Blocks until `condition` holds; it is asked before every step and must have no effect.
-  // Throws SimulationStall when nothing is left that could make it hold. On the main flow, also throws whatever a task
-  // throws.
+  // Blocks until `condition` returns true; it is called before every step and must have no side effects. Throws
+  // SimulationStall if no event is left that could make it true. In the main flow, also rethrows the exceptions of
+  // tasks.
   void blockUntil(const std::function<bool()>& condition, std::string_view what);
-  // Blocks until `condition` holds or `due` has come; as above otherwise.
+  // Blocks until `condition` returns true or `due` is reached; otherwise like the above.
   void blockUntil(const std::function<bool()>& condition, std::chrono::nanoseconds due, std::string_view what);
 
-  // Throws a SimulationStall about `what`, for calls that are never to return.
+  // Throws a SimulationStall with `what`, for calls that must never return.
   [[noreturn]] void stall(std::string_view what) const;
 
  private:
@@ -88,9 +88,9 @@ class VirtualScheduler final {
     std::shared_ptr<Strand> strand;
     Task task;
   };
-  using DueTime = std::pair<std::chrono::nanoseconds, std::uint64_t>;  // equal times keep the order of submission
+  using DueTime = std::pair<std::chrono::nanoseconds, std::uint64_t>;  // the number orders tasks with equal times
 
-  // A blocking call that has not returned; `due` is when the condition comes to hold by itself.
+  // A blocking call in progress; `due` is when it ends without its condition.
   struct Wait {
     const std::function<bool()>& condition;
     std::chrono::nanoseconds due;
@@ -108,11 +108,11 @@ class VirtualScheduler final {
   std::shared_ptr<ScheduleStrategy> chooser_;
   std::chrono::nanoseconds now_{0};
   std::uint64_t submitted_ = 0;
-  std::map<DueTime, Delayed> delayed_;             // all after now_
-  std::vector<std::shared_ptr<Strand>> runnable_;  // lanes with due tasks of which none is running, longest there first
-  Flow* current_ = nullptr;                        // the task that is executing; null while the main flow is
-  std::vector<std::unique_ptr<Flow>> blocked_;     // tasks in a blocking call, longest there first
-  std::vector<std::unique_ptr<Flow>> idle_;        // kept for their stacks
+  std::map<DueTime, Delayed> delayed_;             // all later than now_
+  std::vector<std::shared_ptr<Strand>> runnable_;  // with due tasks and no running one, the longest-waiting first
+  Flow* current_ = nullptr;                        // the running task; null in the main flow
+  std::vector<std::unique_ptr<Flow>> blocked_;     // tasks in a blocking call, the longest-waiting first
+  std::vector<std::unique_ptr<Flow>> idle_;        // kept for reuse of their stacks
 };
 
 }  // namespace quazor

@@ -22,7 +22,7 @@ using ::testing::HasSubstr;
 using ::testing::UnorderedElementsAre;
 using Words = std::vector<std::string>;
 
-// Chooses as told, then always the first; keeps how many things there were to choose from.
+// Follows a list of choices, then always chooses the first; records the number of alternatives.
 class ScriptedChooser final : public ScheduleStrategy {
  public:
   explicit ScriptedChooser(std::vector<std::size_t> script = {}) : script_(std::move(script)) {}
@@ -147,7 +147,7 @@ TEST_F(VirtualSchedulerTest, ATaskIsDestroyedWhenItHasRunAndBeforeTheNextStarts)
     ~Says() { words.push_back("destroyed"); }
   };
   scheduler_.submit(strand, [this, says = std::make_unique<Says>(Says{words_})] { words_.push_back("runs"); });
-  words_.clear();  // of the temporary above
+  words_.clear();  // discards the words of the temporary
   scheduler_.submit(strand, say("next"));
   scheduler_.blockUntil(1s, "the test");
   EXPECT_THAT(words_, ElementsAre("runs", "destroyed", "next"));
@@ -159,11 +159,11 @@ TEST_F(VirtualSchedulerTest, DroppingWhatIsDelayedLeavesWhatIsDueAndOtherLanes) 
   const auto token = std::make_shared<int>();
   scheduler_.submit(strand, say("due"));
   scheduler_.submitAt(1s, strand, [this, token] { words_.push_back("delayed"); });
-  scheduler_.submitAt(1s, other, say("of another lane"));
+  scheduler_.submitAt(1s, other, say("of another strand"));
   scheduler_.dropDelayed(*strand);
   EXPECT_EQ(token.use_count(), 1);
   scheduler_.blockUntil(2s, "the test");
-  EXPECT_THAT(words_, ElementsAre("due", "of another lane"));
+  EXPECT_THAT(words_, ElementsAre("due", "of another strand"));
 }
 
 TEST_F(VirtualSchedulerTest, AStallSaysWhatWasWaitedForAndWhen) {
@@ -172,7 +172,7 @@ TEST_F(VirtualSchedulerTest, AStallSaysWhatWasWaitedForAndWhen) {
     scheduler_.blockUntil([] { return false; }, "a lamp is to light up");
     FAIL() << "the wait returned";
   } catch (const SimulationStall& stall) {
-    EXPECT_STREQ(stall.what(), "The simulated phone waits for ever: a lamp is to light up, at 1.5 s of virtual time.");
+    EXPECT_STREQ(stall.what(), "The simulated phone waits forever: a lamp is to light up, at 1.5 s of virtual time.");
   }
 }
 
@@ -236,7 +236,7 @@ TEST_F(VirtualSchedulerTest, DiscardingDestroysPendingTasksAndThoseThatTheyLeave
     }
   };
   auto leaves = std::make_unique<SubmitsWhenDestroyed>(SubmitsWhenDestroyed{scheduler_, strand, token});
-  scheduler_.discardPending();  // what the temporary left
+  scheduler_.discardPending();  // discards the task of the temporary
   scheduler_.submit(strand, [token] {});
   scheduler_.submitAt(1h, strand, [leaves = std::move(leaves)] {});
   EXPECT_EQ(token.use_count(), 3);
@@ -294,8 +294,8 @@ TEST(VirtualSchedulerChoices, WithOneThingToDoTheChooserIsNotAsked) {
   EXPECT_TRUE(chooser->counts.empty());
 }
 
-// Two lanes of two tasks each, and the main flow that waits for both.
-Words runOfTwoLanes(const std::shared_ptr<ScheduleStrategy>& chooser) {
+// Two strands with two tasks each, and the main flow waiting for both.
+Words runOfTwoStrands(const std::shared_ptr<ScheduleStrategy>& chooser) {
   VirtualScheduler scheduler(chooser);
   Words words;
   int left = 4;
@@ -320,7 +320,7 @@ TEST(VirtualSchedulerChoices, ReplayingPrefixesOfChoicesReachesEveryInterleaving
     const std::vector<std::size_t> prefix = open.back();
     open.pop_back();
     const auto chooser = std::make_shared<ScriptedChooser>(prefix);
-    reached.insert(runOfTwoLanes(chooser));
+    reached.insert(runOfTwoStrands(chooser));
     ++runs;
     for (std::size_t at = prefix.size(); at < chooser->counts.size(); ++at) {
       for (std::size_t choice = 1; choice < chooser->counts[at]; ++choice) {
@@ -331,7 +331,7 @@ TEST(VirtualSchedulerChoices, ReplayingPrefixesOfChoicesReachesEveryInterleaving
       }
     }
   }
-  EXPECT_EQ(runs, 6);  // the ways to merge two sequences of two
+  EXPECT_EQ(runs, 6);  // the number of ways to merge two sequences of two
   EXPECT_EQ(reached.size(), 6U);
   for (const Words& words : reached) {
     EXPECT_LT(std::ranges::find(words, "a1"), std::ranges::find(words, "a2"));
@@ -342,8 +342,8 @@ TEST(VirtualSchedulerChoices, ReplayingPrefixesOfChoicesReachesEveryInterleaving
 TEST(VirtualSchedulerChoices, OneSeedIsOneOrderAndSeedsDiffer) {
   std::set<Words> reached;
   for (std::uint64_t seed = 0; seed < 64; ++seed) {
-    const Words words = runOfTwoLanes(std::make_shared<RandomStrategy>(seed));
-    EXPECT_EQ(words, runOfTwoLanes(std::make_shared<RandomStrategy>(seed)));
+    const Words words = runOfTwoStrands(std::make_shared<RandomStrategy>(seed));
+    EXPECT_EQ(words, runOfTwoStrands(std::make_shared<RandomStrategy>(seed)));
     reached.insert(words);
   }
   EXPECT_EQ(reached.size(), 6U);

@@ -9,8 +9,8 @@
 
 namespace quazor {
 
-// The scheduler's time. The wall clock reads 2026-01-01 00:00:00 UTC at virtual time 0. Sleeping runs the scheduler;
-// sleeping beyond the clock's range throws SimulationStall when nothing else is left to happen.
+// The scheduler's time. The wall clock shows 2026-01-01 00:00:00 UTC at virtual time 0. Sleeping runs the scheduler;
+// sleeping beyond the range of the clock throws SimulationStall when no other event is left.
 //
 // Thread: the scheduler's.
 class VirtualClock final : public Clock {
@@ -25,10 +25,10 @@ class VirtualClock final : public Clock {
   std::shared_ptr<VirtualScheduler> scheduler_;
 };
 
-// Queues are lanes of the scheduler and run whenever something blocks; the quality of service has no influence: any
-// order may come. A semaphore that nothing can signal any more throws SimulationStall out of its wait.
+// Queues are strands of the scheduler and run whenever something blocks; the quality of service has no effect, because
+// any order is possible. Waiting for a semaphore that nothing can signal any more throws SimulationStall.
 //
-// Thread: the scheduler's, for what it makes too.
+// Thread: the scheduler's, also for the queues and semaphores.
 class VirtualConcurrency final : public Concurrency {
  public:
   explicit VirtualConcurrency(std::shared_ptr<VirtualScheduler> scheduler) : scheduler_(std::move(scheduler)) {}

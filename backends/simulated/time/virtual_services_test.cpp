@@ -13,7 +13,7 @@ namespace {
 
 using namespace std::chrono_literals;
 
-// Chooses the last of what there is.
+// Always chooses the last alternative.
 class LastChooser final : public ScheduleStrategy {
  public:
   std::size_t choose(std::size_t count) override { return count - 1; }
@@ -84,7 +84,7 @@ TEST_F(VirtualServicesTest, ASemaphoreThatNothingWillSignalStalls) {
     FAIL() << "the wait returned";
   } catch (const SimulationStall& stall) {
     EXPECT_STREQ(stall.what(),
-                 "The simulated phone waits for ever: a semaphore is waited for that nothing will signal, at 0 s of "
+                 "The simulated phone waits forever: a semaphore is waited for that nothing will signal, at 0 s of "
                  "virtual time.");
   }
 }

@@ -1,4 +1,4 @@
-// A plug-in for tests of the host: it registers an analysis and nothing else.
+// A plug-in for tests of the host: it registers only an analysis.
 #include "contract/lab.h"
 #include "host/testing/plugins/fake_diagnostic.h"
 

@@ -1,4 +1,4 @@
-// A plug-in for tests of the host: one of its diagnostics has the experiment of working_plugin.cpp, one is all its own.
+// A plug-in for tests of the host: a diagnostic with the experiment of working_plugin.cpp, and one with its own.
 #include "contract/lab.h"
 #include "host/testing/plugins/fake_diagnostic.h"
 

@@ -1,4 +1,4 @@
-// A plug-in for tests of the host: its diagnostic names an analysis that nobody has.
+// A plug-in for tests of the host: its diagnostic names an analysis that does not exist.
 #include "contract/lab.h"
 
 #include <memory>

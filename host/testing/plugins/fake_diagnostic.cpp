@@ -16,7 +16,7 @@ Behaviour behaviourOf(const Dictionary& parameters) {
   return static_cast<Behaviour>(toInt32(parameters.find("behaviour")));
 }
 
-// Each case of `Behaviour` that is about one operation: fails it, with or without an error, or throws.
+// Sets an error of the test domain and returns false.
 bool failWith(DiagnosticErrorPtr* error, std::int64_t code, std::string_view message) {
   fail(error, kDomain, code, nullptr, "%@", message);
   return false;

@@ -1,4 +1,4 @@
-// A diagnostic for tests, whose parameters say what it does.
+// A diagnostic for tests; its parameters determine its behaviour.
 #pragma once
 
 #include "contract/diagnostic_contract.h"
@@ -12,21 +12,21 @@ namespace quazor::fake {
 enum class Behaviour {
   kNormal = 0,
 
-  // Of the experiment.
+  // Experiment.
   kSetupFails = 1,
   kSetupFailsWithoutError = 2,
   kSetupThrows = 3,
   kSetupThrowsAnInteger = 4,
-  kRunFails = 5,  // with an error that has an underlying one
+  kRunFails = 5,  // with an underlying error
   kRunFailsWithoutError = 6,
   kRunThrows = 7,
-  kRunSucceedsWithError = 8,  // gives a result, and an error beside it
+  kRunSucceedsWithError = 8,  // returns a result and also sets an error
   kTeardownFails = 9,
   kTeardownThrows = 10,
   kRunAndTeardownFail = 11,
   kRunThrowsAnInteger = 12,
 
-  // Of the analysis.
+  // Analysis.
   kAnalysisSetupFails = 20,
   kAnalysisSetupThrows = 21,
   kAnalyzingFails = 22,
@@ -37,8 +37,8 @@ enum class Behaviour {
   kNotANumber = 27,
 };
 
-// Parameters: "duration", required, the seconds it sleeps by the platform's clock; "measured", what it measures;
-// "behaviour". The result has the measurement "Count" and auxiliary data of several kinds.
+// Parameters: "duration" (required), seconds to sleep by the platform's clock; "measured", the value of the measurement
+// "Count"; "behaviour". The result also has auxiliary data of several kinds.
 class FakeExperiment : public QZExperiment, public QZTeardown {
  public:
   QZDescription experimentDescription() const override;
@@ -52,8 +52,8 @@ class FakeExperiment : public QZExperiment, public QZTeardown {
   double measured_ = 0;
 };
 
-// Parameters: "minimum", the closed lower bound of the result "Count"; "behaviour". There is a second result, "Echo",
-// without a limit.
+// Parameters: "minimum", the closed lower bound of the result "Count"; "behaviour". The second result, "Echo", has no
+// limit.
 class FakeAnalysis : public QZAnalysis, public QZAnalysisSetup {
  public:
   QZDescription analysisDescription() const override;

@@ -1,5 +1,5 @@
-// A plug-in for tests of the host: loading it ends the process or never ends. In the environment FATAL_PLUGIN says how:
-// "hang", or "=" and a line that it writes to its process's connection to quazor before it hangs.
+// A plug-in for tests of the host: loading it ends the process or never returns. The environment variable FATAL_PLUGIN
+// selects the behaviour: "hang", or "=" and a line that it writes to the connection to quazor before it hangs.
 #include <unistd.h>
 
 #include <cstdlib>

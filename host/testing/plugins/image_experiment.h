@@ -1,4 +1,4 @@
-// An experiment for tests that gives images of samples.
+// An experiment for tests that returns images of samples.
 #pragma once
 
 #include "contract/diagnostic_contract.h"
@@ -8,8 +8,8 @@
 
 namespace quazor::fake {
 
-// Parameters: "images", required, how many images the result has; "samples", how many samples each of their two lists
-// has, 48 when not set. Sample k of list "i" is k - 10, of list "q" it is -1000 k.
+// Parameters: "images" (required), the number of images; "samples", the length of their two lists, by default 48.
+// Sample k of list "i" is k - 10, that of list "q" is -1000 k.
 class ImageExperiment final : public QZExperiment {
  public:
   QZDescription experimentDescription() const override;

@@ -1,4 +1,4 @@
-// A plug-in for tests of the host: it registers one name twice.
+// A plug-in for tests of the host: it registers the same name twice.
 #include "contract/lab.h"
 
 #include <memory>

@@ -15,7 +15,7 @@ namespace quazor::fake {
 
 namespace {
 
-// Parameters: "frameCount", how many frames it waits for; "timeout", which it only declares.
+// Parameters: "frameCount", the number of frames to wait for; "timeout", which has no effect.
 class StreamingExperiment final : public QZExperiment {
  public:
   QZDescription experimentDescription() const override {

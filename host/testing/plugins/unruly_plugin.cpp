@@ -17,14 +17,14 @@ namespace quazor::fake {
 
 namespace {
 
-// Where quazor's processes have their connection.
+// The descriptor of the connection in quazor's child processes.
 constexpr int kConnection = 250;
 
 void tell(std::string_view text) {
   if (::write(kConnection, text.data(), text.size()) < 0) ::_exit(99);
 }
 
-// The values of the parameter "way".
+// Misbehaves according to the parameter "way".
 void goWrong(int way) {
   switch (way) {
     case 1: std::abort();

@@ -1,4 +1,4 @@
-// A plug-in for tests of the host: one diagnostic that does as it is told, and some that cannot even be made.
+// A plug-in for tests of the host: a diagnostic that works, and some that cannot even be created.
 #include "contract/lab.h"
 #include "host/testing/plugins/fake_diagnostic.h"
 

@@ -1,7 +1,7 @@
 make_channels
 diagnose complete TesselTelemonDiagnostic
 channel=$(sed -n 5p /rig/channels)
-# A process of its own in the group takes processor time, which is what the group counts.
+# A process in the group uses processor time, which the group counts.
 sh -c 'echo $$ >"$1/cgroup.procs"; i=0; while [ $i -lt 2000 ]; do i=$((i + 1)); done' - "/sys/fs/cgroup/$channel"
 diagnose raised TesselTelemonDiagnostic
 remake_channels

@@ -2,7 +2,7 @@ load_devices
 make_channels
 lit() { video_control platform:vivid-004 capture get Boolean; }
 dark() { [ "$(lit)" = 0 ]; }
-# The diagnostic's process, which is the one that has the camera open, is killed; then the program itself.
+# Kills the process of the diagnostic, which has the camera open, and then the program itself.
 holders() {
   local node link
   node=$(video_control platform:vivid-004 capture path)

@@ -9,7 +9,7 @@ diagnose disturbed CameraSyncDiagnostic.Back --set duration=2.015
 wait
 diagnose absent CameraSyncDiagnostic.Front --set duration=2.015
 plug_again
-# Of these cameras one has a counter in a control, which goes with the device.
+# One of these cameras has a counter in a control, which disappears with the device.
 when_streaming platform:vivid-003 sh -c "echo vivid.0 >$driver/unbind"
 diagnose uncounted CameraSyncDiagnostic.Front --set duration=2.015
 wait
