@@ -7,6 +7,4 @@ CameraBack::~CameraBack() = default;
 StreamingBack::~StreamingBack() = default;
 CaptureBack::~CaptureBack() = default;
 
-void CaptureBack::perform(const CaptureCall&, DiagnosticErrorPtr*, const std::function<bool()>& body) const { body(); }
-
 }  // namespace quazor

@@ -11,11 +11,9 @@
 
 #include <cstddef>
 #include <cstdint>
-#include <functional>
 #include <memory>
 #include <optional>
 #include <string>
-#include <string_view>
 #include <vector>
 
 namespace quazor {
@@ -109,14 +107,6 @@ class StreamingBack {
   virtual bool end(CaptureRun& run, DiagnosticErrorPtr* error) = 0;
 };
 
-// A call on an object of the service, as it comes in. Borrows; lives for one call.
-struct CaptureCall {
-  std::string_view operation;           // of capture_operation (property_table.h)
-  std::string_view object;              // the camera's or the group's name, where there are several
-  std::string_view property;            // that is read or set
-  std::function<std::string()> detail;  // what the call is about: the property and its value, or the streams
-};
-
 // Thread: any, but for what comes with a camera.
 class CaptureBack {
  public:
@@ -138,8 +128,6 @@ class CaptureBack {
 
   // Stores the backend's error for the refusal. REQUIRES: `error` is not null.
   virtual void storeRefusal(DiagnosticErrorPtr* error, CaptureRefusal reason, std::string message) const = 0;
-  // Makes the call: `body` is true when it has succeeded. A backend may look on, or make the call fail.
-  virtual void perform(const CaptureCall& call, DiagnosticErrorPtr* error, const std::function<bool()>& body) const;
 };
 
 // The caller's error variable and the backend whose errors are stored in it.

@@ -1,6 +1,5 @@
 #include "backends/capture/capture_client.h"
 
-#include "backends/capture/property_table.h"
 #include "platform/capture_keys.h"
 
 #include <algorithm>
@@ -13,8 +12,6 @@ CaptureClientId newClient(CaptureSlots& slots) {
   const std::lock_guard lock(slots.mutex);
   return ++slots.lastClient;
 }
-
-std::string nothing() { return {}; }
 
 bool checkRates(const CameraSlot& camera, const Refuser& refuse) {
   const CameraSettings& settings = camera.settings;
@@ -98,8 +95,7 @@ bool CaptureClient::checkControl(const CameraSlot& camera, const Refuser& refuse
 
 bool CaptureClient::start(std::size_t index, DiagnosticErrorPtr* error) {
   CameraSlot& camera = slots_->cameras[index];
-  return perform({capture_operation::kStart, camera.info().name, {}, nothing}, error,
-                 [&](const Refuser& refuse) { return begin(camera, refuse); });
+  return perform(error, [&](const Refuser& refuse) { return begin(camera, refuse); });
 }
 
 bool CaptureClient::begin(CameraSlot& camera, const Refuser& refuse) {
@@ -117,20 +113,15 @@ bool CaptureClient::begin(CameraSlot& camera, const Refuser& refuse) {
 
 bool CaptureClient::stop(std::size_t index, DiagnosticErrorPtr* error) {
   CameraSlot& camera = slots_->cameras[index];
-  bool stopped = false;
-  slots_->back->perform({capture_operation::kStop, camera.info().name, {}, nothing}, error, [&] {
-    const bool stopping = locked(error, [&](const Refuser& refuse) {
-      if (!checkControl(camera, refuse)) return false;
-      if (camera.phase != StreamPhase::kRunning) {
-        return refuse(CaptureRefusal::kWrongState, "%@ is not running; it cannot be stopped.", camera.info().name);
-      }
-      camera.phase = StreamPhase::kStopping;
-      return true;
-    });
-    stopped = stopping && end(camera, error);
-    return stopped;
+  const bool stopping = perform(error, [&](const Refuser& refuse) {
+    if (!checkControl(camera, refuse)) return false;
+    if (camera.phase != StreamPhase::kRunning) {
+      return refuse(CaptureRefusal::kWrongState, "%@ is not running; it cannot be stopped.", camera.info().name);
+    }
+    camera.phase = StreamPhase::kStopping;
+    return true;
   });
-  return stopped;
+  return stopping && end(camera, error);
 }
 
 // Ends what this call has set to kStopping: no other call changes the camera's phase or run in the meantime.
@@ -144,13 +135,8 @@ bool CaptureClient::end(CameraSlot& camera, DiagnosticErrorPtr* error) {
 }
 
 bool CaptureClient::invalidate(DiagnosticErrorPtr* error) {
-  bool invalidated = false;
-  slots_->back->perform({capture_operation::kInvalidate, {}, {}, nothing}, error, [&] {
-    const bool valid = locked(error, [&](const Refuser&) { return invalidated_ = true; });
-    invalidated = valid && release(error);
-    return invalidated;
-  });
-  return invalidated;
+  const bool valid = perform(error, [&](const Refuser&) { return invalidated_ = true; });
+  return valid && release(error);
 }
 
 bool CaptureClient::release(DiagnosticErrorPtr* error) {

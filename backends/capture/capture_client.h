@@ -95,17 +95,17 @@ class CaptureClient final {
   CaptureClientId id() const { return id_; }
   CaptureSlots& slots() const { return *slots_; }
 
-  // Makes a call whose body, body(refuse), says by its result whether it succeeded: a boolean or an optional. The body
-  // runs with the mutex held; after invalidate() it does not run and the call is refused.
+  // Makes a call: the result is that of body(refuse), which runs with the mutex held. After invalidate() the body does
+  // not run and the call is refused: the result is false or nothing.
   template <class Body>
-  std::invoke_result_t<Body&, const Refuser&> perform(const CaptureCall& call, DiagnosticErrorPtr* error,
-                                                      Body&& body) const {
-    std::invoke_result_t<Body&, const Refuser&> result{};
-    slots_->back->perform(call, error, [&] {
-      result = locked(error, body);
-      return static_cast<bool>(result);
-    });
-    return result;
+  std::invoke_result_t<Body&, const Refuser&> perform(DiagnosticErrorPtr* error, Body&& body) const {
+    const HeldSlots held(*slots_);
+    const Refuser refuse(*slots_->back, error);
+    if (invalidated_) {
+      refuse(CaptureRefusal::kInvalidated, "The capture device has been invalidated; ask for a new one.");
+      return {};
+    }
+    return body(refuse);
   }
 
   // For the bodies of perform(). True if this user has control of the camera; otherwise stores an error that names the
@@ -120,16 +120,6 @@ class CaptureClient final {
   bool invalidate(DiagnosticErrorPtr* error);
 
  private:
-  template <class Body>
-  std::invoke_result_t<Body&, const Refuser&> locked(DiagnosticErrorPtr* error, Body&& body) const {
-    const HeldSlots held(*slots_);
-    const Refuser refuse(*slots_->back, error);
-    if (invalidated_) {
-      refuse(CaptureRefusal::kInvalidated, "The capture device has been invalidated; ask for a new one.");
-      return {};
-    }
-    return body(refuse);
-  }
   bool begin(CameraSlot& camera, const Refuser& refuse);
   bool end(CameraSlot& camera, DiagnosticErrorPtr* error);
   bool release(DiagnosticErrorPtr* error);

@@ -13,18 +13,6 @@ namespace {
 
 constexpr std::string_view kDeviceName = "capture device";
 
-std::string noDetail() { return {}; }
-
-// "(a, b)": the cameras' names; of what is no stream of this service, its description.
-std::string namesOf(const CaptureStreams& streams) {
-  std::vector<std::string> names;
-  for (const std::shared_ptr<CaptureStream>& stream : streams) {
-    const auto* own = dynamic_cast<const ClientStream*>(stream.get());
-    names.push_back(own == nullptr ? defaultText(stream) : own->name());
-  }
-  return defaultText(names);
-}
-
 // Thread: any.
 class ClientDevice final : public CaptureDevice {
  public:
@@ -41,38 +29,33 @@ class ClientDevice final : public CaptureDevice {
   std::string description() const override { return std::string(kDeviceName); }
 
   std::optional<CaptureStreams> streams(DiagnosticErrorPtr* error) override {
-    return client_->perform({capture_operation::kDeviceStreams, {}, {}, noDetail}, error, [&](const Refuser&) {
+    return client_->perform(error, [&](const Refuser&) {
       return std::optional<CaptureStreams>(std::in_place, streams_.begin(), streams_.end());
     });
   }
 
   std::optional<SynchronizedStreamsGroups> synchronizedStreamsGroups(DiagnosticErrorPtr* error) override {
-    return client_->perform({capture_operation::kGroups, {}, {}, noDetail}, error, [&](const Refuser&) {
+    return client_->perform(error, [&](const Refuser&) {
       return std::optional<SynchronizedStreamsGroups>(std::in_place, groups_.begin(), groups_.end());
     });
   }
 
   bool requestControlOfStreams(const CaptureStreams& streams, DiagnosticErrorPtr* error) override {
-    return client_->perform({capture_operation::kRequestControl, {}, {}, [&] { return namesOf(streams); }}, error,
-                            [&](const Refuser& refuse) { return acquireAll(streams, refuse); });
+    return client_->perform(error, [&](const Refuser& refuse) { return acquireAll(streams, refuse); });
   }
 
   bool relinquishControlOfStreams(const CaptureStreams& streams, DiagnosticErrorPtr* error) override {
-    return client_->perform({capture_operation::kRelinquishControl, {}, {}, [&] { return namesOf(streams); }}, error,
-                            [&](const Refuser& refuse) { return releaseAll(streams, refuse); });
+    return client_->perform(error, [&](const Refuser& refuse) { return releaseAll(streams, refuse); });
   }
 
   bool invalidate(DiagnosticErrorPtr* error) override { return client_->invalidate(error); }
 
   std::optional<Value> valueForProperty(std::string_view key, DiagnosticErrorPtr* error) override {
-    return client_->perform({capture_operation::kReadDevice, {}, key, [&] { return std::string(key); }}, error,
-                            [&](const Refuser& refuse) { return read(key, refuse); });
+    return client_->perform(error, [&](const Refuser& refuse) { return read(key, refuse); });
   }
 
   bool setValue(const Value& value, std::string_view key, DiagnosticErrorPtr* error) override {
-    return client_->perform(
-        {capture_operation::kSetDevice, {}, key, [&] { return formatMessage("%@ = %@", key, value); }}, error,
-        [&](const Refuser& refuse) { return set(value, key, refuse); });
+    return client_->perform(error, [&](const Refuser& refuse) { return set(value, key, refuse); });
   }
 
  private:
@@ -209,14 +192,10 @@ class CheckedPlugIn final : public CapturePlugIn {
   std::string description() const override { return "capture plug-in"; }
 
   std::shared_ptr<CaptureDevice> device(DiagnosticErrorPtr* error) override {
-    std::shared_ptr<CaptureDevice> device;
-    slots_->back->perform({capture_operation::kDevice, {}, {}, noDetail}, error, [&] {
-      const std::string missing = slots_->back->missingDevice();
-      if (!missing.empty()) return Refuser(*slots_->back, error)(CaptureRefusal::kNoDevice, "%@", missing);
-      device = std::make_shared<ClientDevice>(std::make_shared<CaptureClient>(slots_));
-      return true;
-    });
-    return device;
+    const std::string missing = slots_->back->missingDevice();
+    if (missing.empty()) return std::make_shared<ClientDevice>(std::make_shared<CaptureClient>(slots_));
+    Refuser(*slots_->back, error)(CaptureRefusal::kNoDevice, "%@", missing);
+    return nullptr;
   }
 
  private:
@@ -231,23 +210,13 @@ class CheckedCapture final : public CaptureService {
         defaultPlugIn_(std::make_shared<CheckedPlugIn>(slots_)) {}
 
   std::shared_ptr<CapturePlugIn> createPlugIn() override {
-    return load(capture_operation::kCreatePlugIn, [&] { return std::make_shared<CheckedPlugIn>(slots_); });
+    return slots_->back->plugInLoads() ? std::make_shared<CheckedPlugIn>(slots_) : nullptr;
   }
   std::shared_ptr<CapturePlugIn> defaultPlugIn() override {
-    return load(capture_operation::kDefaultPlugIn, [&] { return defaultPlugIn_; });
+    return slots_->back->plugInLoads() ? defaultPlugIn_ : nullptr;
   }
 
  private:
-  template <class Make>
-  std::shared_ptr<CapturePlugIn> load(std::string_view operation, Make&& make) const {
-    std::shared_ptr<CapturePlugIn> plugIn;
-    slots_->back->perform({operation, {}, {}, noDetail}, nullptr, [&] {
-      if (slots_->back->plugInLoads()) plugIn = make();
-      return plugIn != nullptr;
-    });
-    return plugIn;
-  }
-
   const std::shared_ptr<CaptureSlots> slots_;
   const std::shared_ptr<CapturePlugIn> defaultPlugIn_;
 };

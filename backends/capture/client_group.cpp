@@ -15,20 +15,17 @@ ClientGroup::ClientGroup(std::shared_ptr<CaptureClient> client, std::size_t inde
 std::string ClientGroup::description() const { return slot().info.description; }
 
 std::optional<CaptureStreams> ClientGroup::streams(DiagnosticErrorPtr* error) {
-  return client_->perform(
-      {capture_operation::kGroupStreams, name(), {}, [] { return std::string(); }}, error,
-      [&](const Refuser&) { return std::optional<CaptureStreams>(std::in_place, streams_.begin(), streams_.end()); });
+  return client_->perform(error, [&](const Refuser&) {
+    return std::optional<CaptureStreams>(std::in_place, streams_.begin(), streams_.end());
+  });
 }
 
 std::optional<Value> ClientGroup::valueForProperty(std::string_view key, DiagnosticErrorPtr* error) {
-  return client_->perform({capture_operation::kReadGroup, name(), key, [&] { return std::string(key); }}, error,
-                          [&](const Refuser& refuse) { return read(key, refuse); });
+  return client_->perform(error, [&](const Refuser& refuse) { return read(key, refuse); });
 }
 
 bool ClientGroup::setValue(const Value& value, std::string_view key, DiagnosticErrorPtr* error) {
-  return client_->perform(
-      {capture_operation::kSetGroup, name(), key, [&] { return formatMessage("%@ = %@", key, value); }}, error,
-      [&](const Refuser& refuse) { return set(value, key, refuse); });
+  return client_->perform(error, [&](const Refuser& refuse) { return set(value, key, refuse); });
 }
 
 Value ClientGroup::streamOf(std::size_t camera) const {

@@ -47,14 +47,11 @@ ClientStream::ClientStream(std::shared_ptr<CaptureClient> client, std::size_t in
 std::string ClientStream::description() const { return slot().info().description; }
 
 std::optional<Value> ClientStream::valueForProperty(std::string_view key, DiagnosticErrorPtr* error) {
-  return client_->perform({capture_operation::kReadStream, name(), key, [&] { return std::string(key); }}, error,
-                          [&](const Refuser& refuse) { return read(key, refuse); });
+  return client_->perform(error, [&](const Refuser& refuse) { return read(key, refuse); });
 }
 
 bool ClientStream::setValue(const Value& value, std::string_view key, DiagnosticErrorPtr* error) {
-  return client_->perform(
-      {capture_operation::kSetStream, name(), key, [&] { return formatMessage("%@ = %@", key, value); }}, error,
-      [&](const Refuser& refuse) { return set(value, key, refuse); });
+  return client_->perform(error, [&](const Refuser& refuse) { return set(value, key, refuse); });
 }
 
 bool ClientStream::start(DiagnosticErrorPtr* error) { return client_->start(index_, error); }

@@ -28,10 +28,10 @@ class ClientStream final : public CaptureStream {
   bool stop(DiagnosticErrorPtr* error) override;
 
   std::size_t index() const { return index_; }
-  const std::string& name() const { return slot().info().name; }
 
  private:
   CameraSlot& slot() const { return client_->slots().cameras[index_]; }
+  const std::string& name() const { return slot().info().name; }
   std::optional<Value> read(std::string_view key, const Refuser& refuse) const;
   std::optional<Value> readRate(std::string_view key, const std::optional<Value>& rate, const Refuser& refuse) const;
   bool set(const Value& value, std::string_view key, const Refuser& refuse);

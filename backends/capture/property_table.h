@@ -1,5 +1,5 @@
-// What can be called on a capture service, and which properties its objects have: the vocabulary of the service's own
-// checks, of scenario files and of faults.
+// Which properties the objects of a capture service have: the vocabulary of the service's own checks, of scenario files
+// and of faults.
 #pragma once
 
 #include "platform/capture_keys.h"
@@ -47,26 +47,6 @@ inline constexpr std::array kStreamProperties{
 std::span<const CaptureProperty> propertiesOf(CaptureObjectKind kind);
 // The property, or null.
 const CaptureProperty* findProperty(CaptureObjectKind kind, std::string_view key);
-
-namespace capture_operation {
-inline constexpr std::string_view kCreatePlugIn = "CaptureService.createPlugIn";
-inline constexpr std::string_view kDefaultPlugIn = "CaptureService.defaultPlugIn";
-inline constexpr std::string_view kDevice = "CapturePlugIn.device";
-inline constexpr std::string_view kDeviceStreams = "CaptureDevice.streams";
-inline constexpr std::string_view kGroups = "CaptureDevice.synchronizedStreamsGroups";
-inline constexpr std::string_view kRequestControl = "CaptureDevice.requestControlOfStreams";
-inline constexpr std::string_view kRelinquishControl = "CaptureDevice.relinquishControlOfStreams";
-inline constexpr std::string_view kInvalidate = "CaptureDevice.invalidate";
-inline constexpr std::string_view kReadDevice = "CaptureDevice.valueForProperty";
-inline constexpr std::string_view kSetDevice = "CaptureDevice.setValue";
-inline constexpr std::string_view kGroupStreams = "SynchronizedStreamsGroup.streams";
-inline constexpr std::string_view kReadGroup = "SynchronizedStreamsGroup.valueForProperty";
-inline constexpr std::string_view kSetGroup = "SynchronizedStreamsGroup.setValue";
-inline constexpr std::string_view kReadStream = "CaptureStream.valueForProperty";
-inline constexpr std::string_view kSetStream = "CaptureStream.setValue";
-inline constexpr std::string_view kStart = "CaptureStream.start";
-inline constexpr std::string_view kStop = "CaptureStream.stop";
-}  // namespace capture_operation
 
 inline constexpr std::array kPortTypes{
     port_type::BackFacingCamera,  port_type::BackFacingTelephotoCamera, port_type::BackFacingSuperWideCamera,

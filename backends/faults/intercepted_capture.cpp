@@ -88,24 +88,27 @@ std::string namesOf(const CaptureStreams& streams) {
   return defaultText(names);
 }
 
-// What a device and its groups share: their names, and one wrapper for each stream and group.
+// What a device and its groups share: their names, and one wrapper for each stream and group. The streams' wrappers
+// live as long as it, because a device keeps its streams, whoever else holds them.
 //
 // Thread: any.
 class DeviceObjects final : public std::enable_shared_from_this<DeviceObjects> {
  public:
   DeviceObjects(CaptureDevice& device, Calls calls, const ObjectNames& names)
       : calls_(std::move(calls)),
-        namedStreams_(device.streams(nullptr).value_or(CaptureStreams{})),
-        namedGroups_(device.synchronizedStreamsGroups(nullptr).value_or(SynchronizedStreamsGroups{})) {
-    for (std::size_t i = 0; i < std::min(namedStreams_.size(), names.streams.size()); ++i) {
-      names_[namedStreams_[i].get()] = names.streams[i];
+        groupsOfDevice_(device.synchronizedStreamsGroups(nullptr).value_or(SynchronizedStreamsGroups{})) {
+    const CaptureStreams streams = device.streams(nullptr).value_or(CaptureStreams{});
+    for (std::size_t i = 0; i < std::min(streams.size(), names.streams.size()); ++i) {
+      names_[streams[i].get()] = names.streams[i];
     }
-    for (std::size_t i = 0; i < std::min(namedGroups_.size(), names.groups.size()); ++i) {
-      names_[namedGroups_[i].get()] = names.groups[i];
+    for (std::size_t i = 0; i < std::min(groupsOfDevice_.size(), names.groups.size()); ++i) {
+      names_[groupsOfDevice_[i].get()] = names.groups[i];
     }
+    for (const std::shared_ptr<CaptureStream>& stream : streams) streamsOfDevice_.push_back(wrap(stream));
   }
 
   const Calls& calls() const { return calls_; }
+  const SynchronizedStreamsGroups& groupsOfDevice() const { return groupsOfDevice_; }
 
   std::shared_ptr<CaptureStream> wrap(const std::shared_ptr<CaptureStream>& stream) {
     return streams_.wrapperOf(stream,
@@ -133,8 +136,8 @@ class DeviceObjects final : public std::enable_shared_from_this<DeviceObjects> {
   }
 
   const Calls calls_;
-  const CaptureStreams namedStreams_;  // held, so that nothing else gets their addresses
-  const SynchronizedStreamsGroups namedGroups_;
+  const SynchronizedStreamsGroups groupsOfDevice_;  // held, so that nothing else gets their addresses
+  CaptureStreams streamsOfDevice_;                  // wrapped
   std::map<const CaptureObject*, std::string> names_;
   WrapperCache<CaptureStream, InterceptedStream> streams_;
   WrapperCache<SynchronizedStreamsGroup, SynchronizedStreamsGroup> groups_;
@@ -200,7 +203,8 @@ class InterceptedDevice final : public CaptureDevice {
   InterceptedDevice(std::shared_ptr<CaptureDevice> device, Calls calls, const ObjectNames& names)
       : device_(std::move(device)),
         calls_(std::move(calls)),
-        objects_(std::make_shared<DeviceObjects>(*device_, calls_, names)) {}
+        objects_(std::make_shared<DeviceObjects>(*device_, calls_, names)),
+        groups_(objects_->wrap(std::optional(objects_->groupsOfDevice()))) {}
 
   std::string description() const override { return device_->description(); }
 
@@ -240,6 +244,7 @@ class InterceptedDevice final : public CaptureDevice {
   const std::shared_ptr<CaptureDevice> device_;
   const Calls calls_;
   const std::shared_ptr<DeviceObjects> objects_;
+  const std::optional<SynchronizedStreamsGroups> groups_;  // wrapped; not in DeviceObjects, which groups hold
 };
 
 // Shared by the plug-ins of a service. Thread: any.

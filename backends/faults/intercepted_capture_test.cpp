@@ -121,6 +121,26 @@ TEST_F(InterceptedCaptureTest, TheGroupHasTheDevicesOwnStreams) {
   EXPECT_THAT(*group_->streams(nullptr), ElementsAre(streams_[1], streams_[0]));
 }
 
+// As a device of its own does: who holds it may leave its streams and groups to it.
+TEST_F(InterceptedCaptureTest, ADeviceKeepsItsStreamsAndGroupsForAsLongAsItLives) {
+  const auto service =
+      interceptedCapture(std::make_shared<PairService>(innerDevice_), calls_, std::make_shared<const ObjectNames>());
+  std::shared_ptr<CaptureDevice> device = service->createPlugIn()->device(nullptr);
+  const std::weak_ptr<CaptureStream> stream = device->streams(nullptr)->front();
+  std::shared_ptr<SynchronizedStreamsGroup> group = device->synchronizedStreamsGroups(nullptr)->front();
+  const std::weak_ptr<SynchronizedStreamsGroup> sameGroup = group;
+  group.reset();
+  EXPECT_EQ(stream.lock(), device->streams(nullptr)->front());
+  ASSERT_EQ(sameGroup.lock(), device->synchronizedStreamsGroups(nullptr)->front());
+
+  group = sameGroup.lock();
+  device.reset();
+  EXPECT_EQ(group->streams(nullptr)->back(), stream.lock());
+  group.reset();
+  EXPECT_TRUE(stream.expired());
+  EXPECT_TRUE(sameGroup.expired());
+}
+
 TEST_F(InterceptedCaptureTest, ObjectsInPropertiesAreTheServicesOwnOnTheOneSideAndInterceptedOnTheOther) {
   ASSERT_TRUE(group_->setValue(Array{streams_[1], streams_[0]}, "ActiveStreams", nullptr));
   EXPECT_EQ(innerGroup_->kept, Value(Array{inner_[1], inner_[0]}));

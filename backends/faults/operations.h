@@ -1,12 +1,30 @@
 // The operations of a platform by name, for faults and observers.
 #pragma once
 
-#include "backends/capture/property_table.h"
-
 #include <array>
 #include <string_view>
 
 namespace quazor {
+
+namespace capture_operation {
+inline constexpr std::string_view kCreatePlugIn = "CaptureService.createPlugIn";
+inline constexpr std::string_view kDefaultPlugIn = "CaptureService.defaultPlugIn";
+inline constexpr std::string_view kDevice = "CapturePlugIn.device";
+inline constexpr std::string_view kDeviceStreams = "CaptureDevice.streams";
+inline constexpr std::string_view kGroups = "CaptureDevice.synchronizedStreamsGroups";
+inline constexpr std::string_view kRequestControl = "CaptureDevice.requestControlOfStreams";
+inline constexpr std::string_view kRelinquishControl = "CaptureDevice.relinquishControlOfStreams";
+inline constexpr std::string_view kInvalidate = "CaptureDevice.invalidate";
+inline constexpr std::string_view kReadDevice = "CaptureDevice.valueForProperty";
+inline constexpr std::string_view kSetDevice = "CaptureDevice.setValue";
+inline constexpr std::string_view kGroupStreams = "SynchronizedStreamsGroup.streams";
+inline constexpr std::string_view kReadGroup = "SynchronizedStreamsGroup.valueForProperty";
+inline constexpr std::string_view kSetGroup = "SynchronizedStreamsGroup.setValue";
+inline constexpr std::string_view kReadStream = "CaptureStream.valueForProperty";
+inline constexpr std::string_view kSetStream = "CaptureStream.setValue";
+inline constexpr std::string_view kStart = "CaptureStream.start";
+inline constexpr std::string_view kStop = "CaptureStream.stop";
+}  // namespace capture_operation
 
 namespace report_operation {
 inline constexpr std::string_view kSimpleChannels = "ReportFacility.reportWithOnlySimpleChannels";

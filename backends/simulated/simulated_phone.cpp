@@ -68,6 +68,7 @@ void SimulatedPhone::build(const Scenario& scenario, const std::shared_ptr<Clock
   calls_ = std::make_shared<CallInterceptor>(scenario.faults, clock, std::move(hang), simulatedInjectedError);
   hardware_ = std::make_shared<CaptureHardware>(scenario, clock, concurrency);
   Platform inner;
+  inner.capture = makeSimulatedCapture(scenario, hardware_);
   inner.clock = clock;
   inner.reports = makeSimulatedReports(scenario.reports, hardware_);
   inner.hid = std::make_shared<SimulatedHidService>(scenario.hidDevices, clock, *concurrency);
@@ -75,7 +76,6 @@ void SimulatedPhone::build(const Scenario& scenario, const std::shared_ptr<Clock
   inner.runLoops = std::move(runLoops);
   inner.concurrency = std::move(concurrency);
   platform_ = interceptedPlatform(inner, calls_, namesOf(scenario));
-  platform_.capture = makeSimulatedCapture(scenario, hardware_, calls_);  // makes its own calls pass `calls_`
 }
 
 std::vector<FaultStatus> SimulatedPhone::faultStatus() const { return calls_->faultStatus(); }

@@ -47,7 +47,7 @@ ALLOWED = {
     SIMULATED + "time": [*CONTRACT, "backends/threads"],
     SIMULATED + "scenario": [*CONTRACT, "backends/capture", "backends/faults", "base/json", "base/text"],
     SIMULATED + "calls": [*CONTRACT, "backends/capture", "backends/faults", SIMULATED + "scenario"],
-    SIMULATED + "capture": [*CONTRACT, "backends/capture", "backends/faults", SIMULATED + "calls", SIMULATED + "scenario"],
+    SIMULATED + "capture": [*CONTRACT, "backends/capture", SIMULATED + "calls", SIMULATED + "scenario"],
     SIMULATED + "counters": [*CONTRACT, "backends/counters", SIMULATED + "capture", SIMULATED + "scenario"],
     SIMULATED + "display": [*CONTRACT, SIMULATED + "scenario"],
     SIMULATED + "hid": [*CONTRACT, "backends/faults", "backends/hid", SIMULATED + "capture", SIMULATED + "scenario"],
@@ -67,8 +67,7 @@ def parts(folder):
 
 
 ALLOWED[LINUX + "probe"] = [*CONTRACT, "base/text", *parts("backends/linux")]
-ALLOWED["backends/simulated"] = [*CONTRACT, "backends/capture", "backends/faults", "backends/threads",
-                                 *parts("backends/simulated")]
+ALLOWED["backends/simulated"] = [*CONTRACT, "backends/faults", "backends/threads", *parts("backends/simulated")]
 ALLOWED["backends/linux"] = [*CONTRACT, "backends/faults", "backends/threads", *parts("backends/linux")]
 BACKENDS = [name for name in ALLOWED if name.startswith("backends/")]
 

@@ -31,9 +31,8 @@ CaptureGroupInfo infoOfGroup(const CameraGroup& group, const Scenario& scenario)
 // Thread: any.
 class SimulatedCaptureBack final : public CaptureBack {
  public:
-  SimulatedCaptureBack(const Scenario& scenario, std::shared_ptr<CaptureHardware> hardware,
-                       std::shared_ptr<CallInterceptor> calls)
-      : hardware_(std::move(hardware)), calls_(std::move(calls)) {
+  SimulatedCaptureBack(const Scenario& scenario, std::shared_ptr<CaptureHardware> hardware)
+      : hardware_(std::move(hardware)) {
     for (std::size_t i = 0; i < hardware_->cameras.size(); ++i) {
       cameras_.push_back(std::make_shared<SimulatedCamera>(hardware_, i));
     }
@@ -52,13 +51,9 @@ class SimulatedCaptureBack final : public CaptureBack {
   void storeRefusal(DiagnosticErrorPtr* error, CaptureRefusal reason, std::string message) const override {
     failSimulatedCapture(error, captureErrorCode(reason), std::move(message));
   }
-  void perform(const CaptureCall& call, DiagnosticErrorPtr* error, const std::function<bool()>& body) const override {
-    calls_->perform({call.operation, call.object, call.property}, error, call.detail, body);
-  }
 
  private:
   const std::shared_ptr<CaptureHardware> hardware_;
-  const std::shared_ptr<CallInterceptor> calls_;
   std::vector<std::shared_ptr<CameraBack>> cameras_;
   std::vector<CaptureGroupInfo> groups_;
 };
@@ -66,9 +61,8 @@ class SimulatedCaptureBack final : public CaptureBack {
 }  // namespace
 
 std::shared_ptr<CaptureService> makeSimulatedCapture(const Scenario& scenario,
-                                                     std::shared_ptr<CaptureHardware> hardware,
-                                                     std::shared_ptr<CallInterceptor> calls) {
-  return makeCheckedCapture(std::make_shared<SimulatedCaptureBack>(scenario, std::move(hardware), std::move(calls)));
+                                                     std::shared_ptr<CaptureHardware> hardware) {
+  return makeCheckedCapture(std::make_shared<SimulatedCaptureBack>(scenario, std::move(hardware)));
 }
 
 }  // namespace quazor
