@@ -52,11 +52,7 @@ TEST(RecordJson, WritesNumbersThatJsonDoesNotHaveAsText) {
 
 TEST(RecordJson, SaysWhetherABoundIsOpen) {
   DiagnosticRecord record = recordOf("Name", Verdict::kPass);
-  QZMeasuredResult result("R", Measurement(1, QZDimensionlessUnit::frames()));
-  QZLimit limit("L");
-  limit.setUpperBound(std::make_shared<const QZBound>(Measurement(2, QZDimensionlessUnit::frames()), true));
-  result.setLimit(limit);
-  record.measuredResults = {judgeResult(result)};
+  record.measuredResults = {resultWithMaximum(1, 2)};
   EXPECT_EQ(recordJson(record)["measuredResults"][0]["limit"],
             Json::parse(R"({"name": "L", "lower": null, "upper": {"value": 2.0, "open": true}})"));
 }

@@ -34,10 +34,10 @@ struct BenchRun {
 BenchRun runOnBench(Side side, const Scenario& scenario, const std::optional<Fault>& fault, ErrorPlace place);
 
 // What runOnBench() tells of healthy runs, in full.
-extern const char* const kHealthyBackRun;
-extern const char* const kHealthyFrontRun;
+extern const std::string kHealthyBackRun;
+extern const std::string kHealthyFrontRun;
 // The back run on the phone without the master configuration.
-extern const char* const kHealthyBackRunWithoutMasterConfiguration;
+extern const std::string kHealthyBackRunWithoutMasterConfiguration;
 
 // A call of the run: the nth one of the operation, on that object, for that property; nothing is any.
 struct CallOfRun {
@@ -53,7 +53,7 @@ inline constexpr const char* kSetStream = "CaptureStream.setValue";
 
 // A call that fails, and all that comes of it.
 struct FaultRow {
-  const char* name;
+  std::string name;
   CallOfRun call;
   // What is told from the call on. Up to there the run is the healthy one. {error} stands for the text of the call's
   // error, {cause} for the end of an error's chain that it makes.
