@@ -2,6 +2,7 @@
 #include "diagnostics/camera_sync/camera_sync_experiment.h"
 
 #include "contract/message_format.h"
+#include "tests/support/call_failures.h"
 #include "tests/sweeps/camera_sync_bench.h"
 
 #include <gtest/gtest.h>
@@ -182,25 +183,11 @@ log default: BackFacingSuperWideCamera
 TEST(CameraSyncExperiment, MeasuresDroppedFramesAsTheyCome) {
   Scenario scenario = cameraSyncScenario();
   cameraOf(scenario, "front-infrared").droppedFrames = {0, 5, 6};
-  expectTold(healthyUpTo(kHealthyFrontRun, "log default: FrontFacingInfraredCamera",
-                         R"(log default: FrontFacingInfraredCamera
-  Offset: 3
-  Frames: 54
-  Total: 57
-  ErrorCounters: {I2CErrorCount = 55}
-
-front-infrared stop
-front stop
-device relinquish control (front, front-infrared)
-returned a result
-error untouched
-Front.FrameOffset = 0 frames
-Front.Frames = 60 frames
-FrontInfrared.FrameOffset = 3 frames
-FrontInfrared.Frames = 54 frames
-ErrorCounters = {Front = {I2CErrorCount = 44}; FrontInfrared = {I2CErrorCount = 55}}
-)"),
-             Side::kFront, scenario);
+  std::string told = kHealthyFrontRun;
+  replaceAll(told, "  Frames: 57\n  Total: 60\n", "  Frames: 54\n  Total: 57\n");
+  replaceAll(told, "FrontInfrared.Frames = 57 frames", "FrontInfrared.Frames = 54 frames");
+  EXPECT_NE(told, kHealthyFrontRun);
+  expectTold(told, Side::kFront, scenario);
 }
 
 // What the phone itself refuses is told as what a fault refuses.

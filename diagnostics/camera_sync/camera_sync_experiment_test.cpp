@@ -123,17 +123,7 @@ back-cameras set MasterConfiguration = {SlaveConfigurationByPortType = {BackFaci
      "back-wide set FormatIndex = 16"},
     {"TheSupportedKeysAreNotTold",
      {kReadGroup, "back-cameras", "MasterConfigurationSupportedKeys"},
-     R"(back-cameras get MasterConfigurationSupportedKeys -> failed
-log default: Device does not support SlaveConfigurationByPortType, using SynchronizedStreamsSlaveConfiguration instead.
-back-wide get PortType
-back-tele get PortType
-back-tele set SynchronizedStreamsSlaveConfiguration = {StreamingOutputsEnabled = 1; FrameSkippingEnabled = 0; TimeMachineEnabled = 0; MasterToSlaveFrameRateRatio = 1}
-back-super-wide get PortType
-back-wide get PortType
-back-tele get PortType
-back-super-wide get PortType
-back-super-wide set SynchronizedStreamsSlaveConfiguration = {StreamingOutputsEnabled = 1; FrameSkippingEnabled = 0; TimeMachineEnabled = 0; MasterToSlaveFrameRateRatio = 1}
-)",
+     std::string("back-cameras get MasterConfigurationSupportedKeys -> failed\n") + kSlavesConfiguredByThemselves,
      "back-wide set FormatIndex = 16"},
     {"TheMasterConfigurationIsRefused",
      {kSetGroup, "back-cameras", "MasterConfiguration"},

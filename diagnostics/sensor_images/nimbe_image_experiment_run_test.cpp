@@ -4,6 +4,7 @@
 #include "tests/support/call_failures.h"
 #include "tests/support/hand_made_sensor.h"
 #include "tests/support/run_transcript.h"
+#include "tests/support/thrown_text.h"
 
 #include <gtest/gtest.h>
 
@@ -189,12 +190,7 @@ TEST(NimbeImageRunAlone, LetsTheExceptionOfAMissingHidManagerThrough) {
   ASSERT_TRUE(experiment->setupWithParameters({{"images", 1}, {"timeout", 1}}, nullptr, nullptr));
   const std::size_t before = transcript.text().size();
   DiagnosticErrorPtr error = callersOwnError();
-  try {
-    static_cast<void>(experiment->run(&error));
-    ADD_FAILURE() << "nothing was raised";
-  } catch (const std::logic_error& raised) {
-    EXPECT_STREQ(raised.what(), "No HID Manager available?!");
-  }
+  EXPECT_EQ(thrownText<std::logic_error>([&] { return experiment->run(&error); }), "No HID Manager available?!");
   EXPECT_EQ(transcript.text().substr(before), "hid createManager -> failed\n");
   EXPECT_EQ(error, callersOwnError());
 }

@@ -12,7 +12,6 @@ namespace quazor {
 namespace {
 
 using testing::HasSubstr;
-using testing::Not;
 
 enum class End { kNone, kClosed, kOpen };
 
@@ -70,7 +69,7 @@ TEST(PrintRecord, ShowsTheErrorAndWhatCausedIt) {
 }
 
 TEST(PrintRecord, UsesColourOnlyWhenAsked) {
-  EXPECT_THAT(printed(recordOf("Name", Verdict::kPass)), Not(HasSubstr("\033")));
+  EXPECT_THAT(printed(recordOf("Name", Verdict::kPass)), testing::Not(HasSubstr("\033")));
   EXPECT_THAT(printed(recordOf("Name", Verdict::kPass), true),
               testing::AllOf(HasSubstr("  \033[32mPASS\033[0m\n"), HasSubstr("\033[32mpass\033[0m\n")));
   EXPECT_THAT(printed(recordOf("Name", Verdict::kFail), true),
@@ -82,7 +81,7 @@ TEST(PrintRecord, KeepsTerminalSequencesOfAPluginFromTheTerminal) {
   DiagnosticRecord record = recordOf("Na\033[2Jme", Verdict::kPass);
   record.summary = "Sum\033mary";
   record.measuredResults = {judgeResult(QZMeasuredResult("R\033", Measurement(1, QZUnit::unitWithSymbol("u\033"))))};
-  EXPECT_THAT(printed(record), Not(HasSubstr("\033")));
+  EXPECT_THAT(printed(record), testing::Not(HasSubstr("\033")));
 }
 
 TEST(PrintVerdict, IsOneLine) {

@@ -38,6 +38,8 @@ extern const std::string kHealthyBackRun;
 extern const std::string kHealthyFrontRun;
 // The back run on the phone without the master configuration.
 extern const std::string kHealthyBackRunWithoutMasterConfiguration;
+// The part of it in which the slaves are configured.
+extern const char* const kSlavesConfiguredByThemselves;
 
 // A call of the run: the nth one of the operation, on that object, for that property; nothing is any.
 struct CallOfRun {

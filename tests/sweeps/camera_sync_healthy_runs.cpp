@@ -84,7 +84,7 @@ const std::string kHealthyBackRun = backRun(R"(log default: Device supports Slav
 back-cameras set MasterConfiguration = {SlaveConfigurationByPortType = {BackFacingTelephotoCamera = {StreamingOutputsEnabled = 1; FrameSkippingEnabled = 0; TimeMachineEnabled = 0; MasterToSlaveFrameRateRatio = 1}; BackFacingSuperWideCamera = {StreamingOutputsEnabled = 1; FrameSkippingEnabled = 0; TimeMachineEnabled = 0; MasterToSlaveFrameRateRatio = 1}}}
 )");
 
-const std::string kHealthyBackRunWithoutMasterConfiguration = backRun(
+const char* const kSlavesConfiguredByThemselves =
     R"(log default: Device does not support SlaveConfigurationByPortType, using SynchronizedStreamsSlaveConfiguration instead.
 back-wide get PortType
 back-tele get PortType
@@ -94,7 +94,10 @@ back-wide get PortType
 back-tele get PortType
 back-super-wide get PortType
 back-super-wide set SynchronizedStreamsSlaveConfiguration = {StreamingOutputsEnabled = 1; FrameSkippingEnabled = 0; TimeMachineEnabled = 0; MasterToSlaveFrameRateRatio = 1}
-)");
+)";
+
+const std::string kHealthyBackRunWithoutMasterConfiguration = backRun(kSlavesConfiguredByThemselves);
+;
 
 // The group of the back cameras is looked through first: it has streams enough, and none of the ports.
 const std::string kHealthyFrontRun =

@@ -1,6 +1,7 @@
 #include "backends/simulated/time/virtual_scheduler.h"
 
 #include "backends/simulated/time/simulation_stall.h"
+#include "tests/support/thrown_text.h"
 
 #include <gmock/gmock.h>
 #include <gtest/gtest.h>
@@ -18,8 +19,6 @@ namespace {
 
 using namespace std::chrono_literals;
 using ::testing::ElementsAre;
-using ::testing::HasSubstr;
-using ::testing::UnorderedElementsAre;
 using Words = std::vector<std::string>;
 
 // Chooses as told, then always the first; keeps how many things there were to choose from.
@@ -168,12 +167,8 @@ TEST_F(VirtualSchedulerTest, DroppingWhatIsDelayedLeavesWhatIsDueAndOtherLanes) 
 
 TEST_F(VirtualSchedulerTest, AStallSaysWhatWasWaitedForAndWhen) {
   scheduler_.blockUntil(1500ms, "the test");
-  try {
-    scheduler_.blockUntil([] { return false; }, "a lamp is to light up");
-    FAIL() << "the wait returned";
-  } catch (const SimulationStall& stall) {
-    EXPECT_STREQ(stall.what(), "The simulated phone waits for ever: a lamp is to light up, at 1.5 s of virtual time.");
-  }
+  EXPECT_EQ(thrownText<SimulationStall>([&] { scheduler_.blockUntil([] { return false; }, "a lamp is to light up"); }),
+            "The simulated phone waits for ever: a lamp is to light up, at 1.5 s of virtual time.");
 }
 
 TEST_F(VirtualSchedulerTest, AWaitEndsWhenALaterTaskMakesItsConditionHold) {
@@ -209,7 +204,7 @@ TEST_F(VirtualSchedulerTest, ATaskIsToldItsLaneAndTheMainFlowHasNone) {
   });
   scheduler_.submitAt(1s, second, tellLane);
   scheduler_.blockUntil(2s, "the test");
-  EXPECT_THAT(strands, UnorderedElementsAre(first, first, second));
+  EXPECT_THAT(strands, testing::UnorderedElementsAre(first, first, second));
   EXPECT_EQ(strands.front(), first);
   EXPECT_EQ(scheduler_.currentStrand(), nullptr);
 }
@@ -252,12 +247,10 @@ TEST_F(VirtualSchedulerTest, DiscardingUnwindsATaskThatBlocks) {
   };
   scheduler_.submit(strand, [&] {
     const Says says{words_};
-    try {
-      scheduler_.blockUntil([] { return false; }, "a lamp is to light up");
-    } catch (const SimulationStall& stall) {
-      EXPECT_THAT(stall.what(), HasSubstr("a lamp is to light up"));
-      words_.push_back("stalled");
-    }
+    EXPECT_THAT(
+        thrownText<SimulationStall>([&] { scheduler_.blockUntil([] { return false; }, "a lamp is to light up"); }),
+        testing::HasSubstr("a lamp is to light up"));
+    words_.push_back("stalled");
     EXPECT_THROW(scheduler_.blockUntil(1h, "another wait"), SimulationStall);
   });
   scheduler_.blockUntil(1s, "the test");
