@@ -33,9 +33,6 @@ void operator delete[](void* memory, std::size_t /*size*/) noexcept { std::free(
 namespace quazor {
 namespace {
 
-using testing::ElementsAre;
-using testing::IsEmpty;
-
 // Keeps the lines it is given, as "level subsystem category text".
 class KeepingBackend final : public LogBackend {
  public:
@@ -87,8 +84,8 @@ TEST_F(LogChannelTest, HandsOverALineWithItsLevelSubsystemAndCategory) {
   logDefault("%d of %lu", -1, 2U);
   logDebug("100%%");
   const std::string source = sharedLog().subsystem() + " quazor ";
-  EXPECT_THAT(backend_->lines(), ElementsAre("1 " + source + "Lamp front at 0.500000!", "2 " + source + "-1 of 2",
-                                             "3 " + source + "100%"));
+  EXPECT_THAT(backend_->lines(), testing::ElementsAre("1 " + source + "Lamp front at 0.500000!",
+                                                      "2 " + source + "-1 of 2", "3 " + source + "100%"));
 }
 
 TEST_F(LogChannelTest, ALevelEnablesItselfAndTheLevelsBeforeIt) {
@@ -114,13 +111,13 @@ TEST_F(LogChannelTest, WithoutABackendNothingIsEnabledAndLinesAreDropped) {
   EXPECT_FALSE(LogChannel::isEnabled(LogLevel::kError));
   writeOneLinePerLevel();
   sharedLog().write(LogLevel::kError, "written without asking");
-  EXPECT_THAT(backend_->lines(), IsEmpty());
+  EXPECT_THAT(backend_->lines(), testing::IsEmpty());
 }
 
 TEST_F(LogChannelTest, WritingDirectlyAsksForNoLevel) {
   sharedLog().setBackend(backend_, LogLevel::kError);
   sharedLog().write(LogLevel::kDebug, "100%@");
-  EXPECT_THAT(backend_->lines(), ElementsAre("3 org.quazor.camera-sensor-diagnostics quazor 100%@"));
+  EXPECT_THAT(backend_->lines(), testing::ElementsAre("3 org.quazor.camera-sensor-diagnostics quazor 100%@"));
 }
 
 TEST_F(LogChannelTest, AReplacedBackendIsReleasedAndGetsNoMoreLines) {
@@ -145,7 +142,7 @@ TEST_F(LogChannelTest, ADisabledLineFormatsNothingAndAllocatesNothing) {
   logDefault("%@ %@ %@ %@ %lu %lf", object, longText, value, error, 3U, 0.5);
   EXPECT_EQ(allocations, before);
   EXPECT_EQ(object->asked, 0);
-  EXPECT_THAT(backend_->lines(), IsEmpty());
+  EXPECT_THAT(backend_->lines(), testing::IsEmpty());
 }
 
 TEST_F(LogChannelTest, AnEnabledLineFormatsOnce) {

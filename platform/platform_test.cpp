@@ -12,11 +12,21 @@ namespace {
 
 // Implementations without hardware that use only the interfaces, as a host would write them.
 
+// Tells when it is destroyed.
 template <class Interface>
-class Propertyless : public Interface {
+class Watched : public Interface {
  public:
-  explicit Propertyless(bool& destroyed) : destroyed_(destroyed) {}
-  ~Propertyless() override { destroyed_ = true; }
+  explicit Watched(bool& destroyed) : destroyed_(destroyed) {}
+  ~Watched() override { destroyed_ = true; }
+
+ private:
+  bool& destroyed_;
+};
+
+template <class Interface>
+class Propertyless : public Watched<Interface> {
+ public:
+  using Watched<Interface>::Watched;
   std::string description() const override { return "nothing"; }
   std::optional<Value> valueForProperty(std::string_view /*key*/, DiagnosticErrorPtr* /*error*/) override {
     return std::nullopt;
@@ -24,9 +34,6 @@ class Propertyless : public Interface {
   bool setValue(const Value& /*value*/, std::string_view /*key*/, DiagnosticErrorPtr* /*error*/) override {
     return false;
   }
-
- private:
-  bool& destroyed_;
 };
 
 class Stream final : public Propertyless<CaptureStream> {
@@ -58,79 +65,54 @@ class Device final : public Propertyless<CaptureDevice> {
   bool invalidate(DiagnosticErrorPtr* /*error*/) override { return true; }
 };
 
-class PlugIn final : public CapturePlugIn {
+class PlugIn final : public Watched<CapturePlugIn> {
  public:
-  explicit PlugIn(bool& destroyed) : destroyed_(destroyed) {}
-  ~PlugIn() override { destroyed_ = true; }
+  using Watched::Watched;
   std::string description() const override { return "plug-in"; }
   std::shared_ptr<CaptureDevice> device(DiagnosticErrorPtr* /*error*/) override { return nullptr; }
-
- private:
-  bool& destroyed_;
 };
 
-class Capture final : public CaptureService {
+class Capture final : public Watched<CaptureService> {
  public:
-  explicit Capture(bool& destroyed) : destroyed_(destroyed) {}
-  ~Capture() override { destroyed_ = true; }
+  using Watched::Watched;
   std::shared_ptr<CapturePlugIn> createPlugIn() override { return nullptr; }
   std::shared_ptr<CapturePlugIn> defaultPlugIn() override { return nullptr; }
-
- private:
-  bool& destroyed_;
 };
 
-class StoppedClock final : public Clock {
+class StoppedClock final : public Watched<Clock> {
  public:
-  explicit StoppedClock(bool& destroyed) : destroyed_(destroyed) {}
-  ~StoppedClock() override { destroyed_ = true; }
+  using Watched::Watched;
   std::chrono::nanoseconds now() const override { return std::chrono::nanoseconds(5); }
   Date date() const override { return Date{}; }
   void sleep(std::chrono::nanoseconds /*duration*/) override {}
-
- private:
-  bool& destroyed_;
 };
 
-class ImmediateQueue final : public SerialQueue {
+class ImmediateQueue final : public Watched<SerialQueue> {
  public:
-  explicit ImmediateQueue(bool& destroyed) : destroyed_(destroyed) {}
-  ~ImmediateQueue() override { destroyed_ = true; }
+  using Watched::Watched;
   void async(Task task) override { task(); }
   void asyncAfter(std::chrono::nanoseconds /*delay*/, Task task) override { task(); }
-
- private:
-  bool& destroyed_;
 };
 
-class OpenSemaphore final : public Semaphore {
+class OpenSemaphore final : public Watched<Semaphore> {
  public:
-  explicit OpenSemaphore(bool& destroyed) : destroyed_(destroyed) {}
-  ~OpenSemaphore() override { destroyed_ = true; }
+  using Watched::Watched;
   void signal() override {}
   void wait() override {}
-
- private:
-  bool& destroyed_;
 };
 
-class NoConcurrency final : public Concurrency {
+class NoConcurrency final : public Watched<Concurrency> {
  public:
-  explicit NoConcurrency(bool& destroyed) : destroyed_(destroyed) {}
-  ~NoConcurrency() override { destroyed_ = true; }
+  using Watched::Watched;
   std::shared_ptr<SerialQueue> makeSerialQueue(std::string_view /*label*/, QualityOfService /*quality*/) override {
     return nullptr;
   }
   std::shared_ptr<Semaphore> makeSemaphore(long /*count*/) override { return nullptr; }
-
- private:
-  bool& destroyed_;
 };
 
-class Snapshot final : public ReportSnapshot {
+class Snapshot final : public Watched<ReportSnapshot> {
  public:
-  explicit Snapshot(bool& destroyed) : destroyed_(destroyed) {}
-  ~Snapshot() override { destroyed_ = true; }
+  using Watched::Watched;
   const std::vector<ReportSample>& samples() const override { return samples_; }
   std::shared_ptr<const ReportSnapshot> snapshotWithBaseline(const ReportSnapshot& /*baseline*/,
                                                              DiagnosticErrorPtr* /*error*/) const override {
@@ -138,33 +120,24 @@ class Snapshot final : public ReportSnapshot {
   }
 
  private:
-  bool& destroyed_;
   std::vector<ReportSample> samples_;
 };
 
-class ChannelSet final : public ReportChannelSet {
+class ChannelSet final : public Watched<ReportChannelSet> {
  public:
-  explicit ChannelSet(bool& destroyed) : destroyed_(destroyed) {}
-  ~ChannelSet() override { destroyed_ = true; }
+  using Watched::Watched;
   std::shared_ptr<const ReportChannelSet> reportByFilteringChannels(const Predicate& /*keep*/) const override {
     return nullptr;
   }
   std::shared_ptr<const ReportSnapshot> snapshot(DiagnosticErrorPtr* /*error*/) const override { return nullptr; }
-
- private:
-  bool& destroyed_;
 };
 
-class Reports final : public ReportFacility {
+class Reports final : public Watched<ReportFacility> {
  public:
-  explicit Reports(bool& destroyed) : destroyed_(destroyed) {}
-  ~Reports() override { destroyed_ = true; }
+  using Watched::Watched;
   std::shared_ptr<const ReportChannelSet> reportWithOnlySimpleChannels(DiagnosticErrorPtr* /*error*/) override {
     return nullptr;
   }
-
- private:
-  bool& destroyed_;
 };
 
 template <class Interface, class Implementation>

@@ -22,8 +22,6 @@
 namespace quazor {
 namespace {
 
-using ::testing::ElementsAre;
-using ::testing::IsEmpty;
 using Kind = QZLab::Kind;
 
 const struct Row {
@@ -94,7 +92,7 @@ TEST_F(Catalogue, HasTwelveEntriesInOrder) {
     EXPECT_EQ(registrations[i].experimentName, kCatalogue[i].experiment);
     EXPECT_EQ(registrations[i].analysisName, kCatalogue[i].analysis);
   }
-  EXPECT_THAT(QZLab::defaultLab().refusedNames(), IsEmpty());
+  EXPECT_THAT(QZLab::defaultLab().refusedNames(), testing::IsEmpty());
 }
 
 TEST_F(Catalogue, MakesANewInstanceOnEveryCall) {
@@ -132,9 +130,9 @@ TEST_F(Catalogue, GivesEveryExperimentAndAnalysisOfAGroupTheSamePorts) {
 }
 
 TEST_F(Catalogue, ConfiguresTheBackCameras) {
-  EXPECT_THAT(
-      settingsOf("CameraSyncExperiment.Back", "FormatIndex"),
-      ElementsAre("back-wide FormatIndex = 16", "back-tele FormatIndex = 14", "back-super-wide FormatIndex = 9"));
+  EXPECT_THAT(settingsOf("CameraSyncExperiment.Back", "FormatIndex"),
+              testing::ElementsAre("back-wide FormatIndex = 16", "back-tele FormatIndex = 14",
+                                   "back-super-wide FormatIndex = 9"));
   const auto rates = settingsOf("CameraSyncExperiment.Back", "MinimumFrameRate");
   EXPECT_EQ(rates.size(), 3U);
   for (const std::string& rate : rates) EXPECT_TRUE(rate.ends_with(" = 30")) << rate;
@@ -142,7 +140,7 @@ TEST_F(Catalogue, ConfiguresTheBackCameras) {
 
 TEST_F(Catalogue, ConfiguresTheFrontCameras) {
   EXPECT_THAT(settingsOf("CameraSyncExperiment.Front", "FormatIndex"),
-              ElementsAre("front FormatIndex = 1", "front-infrared FormatIndex = 0"));
+              testing::ElementsAre("front FormatIndex = 1", "front-infrared FormatIndex = 0"));
 }
 
 }  // namespace

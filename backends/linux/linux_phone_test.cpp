@@ -15,7 +15,6 @@ namespace {
 
 using namespace std::chrono_literals;
 using ::testing::ElementsAre;
-using ::testing::IsEmpty;
 
 TEST(LinuxPhone, HasEveryServiceOnAMachineWithoutDevices) {
   const std::shared_ptr<LinuxCapture> capture = makeLinuxCapture(Binding());
@@ -30,7 +29,7 @@ TEST(LinuxPhone, HasEveryServiceOnAMachineWithoutDevices) {
   ASSERT_NE(platform.framebuffer, nullptr);
   ASSERT_NE(platform.runLoops, nullptr);
   EXPECT_NE(platform.runLoops->currentRunLoop(), nullptr);
-  EXPECT_THAT(phone.faultStatus(), IsEmpty());
+  EXPECT_THAT(phone.faultStatus(), testing::IsEmpty());
 }
 
 // Fake cameras of a machine whose binding has faults, and a user of them.

@@ -14,7 +14,6 @@ namespace quazor {
 namespace {
 
 using ::testing::ElementsAre;
-using ::testing::IsEmpty;
 
 TEST(RecordingLogTest, KeepsEveryLineInItsOrder) {
   RecordingLog log;
@@ -29,7 +28,7 @@ TEST(RecordingLogTest, TakingTheRecordsLeavesNone) {
   RecordingLog log;
   log.write(LogLevel::kDefault, "s", "c", "one");
   EXPECT_THAT(log.takeRecords(), ElementsAre(LogRecord{LogLevel::kDefault, "s", "c", "one"}));
-  EXPECT_THAT(log.takeRecords(), IsEmpty());
+  EXPECT_THAT(log.takeRecords(), testing::IsEmpty());
   log.write(LogLevel::kDefault, "s", "c", "two");
   EXPECT_THAT(log.records(), ElementsAre(LogRecord{LogLevel::kDefault, "s", "c", "two"}));
 }

@@ -12,7 +12,6 @@
 namespace quazor {
 namespace {
 
-using ::testing::ElementsAre;
 using ::testing::Pair;
 
 class SystemLogTest : public ::testing::Test {
@@ -34,8 +33,8 @@ TEST_F(SystemLogTest, LinesHaveTheirPriorityAndCategory) {
   log_.write(LogLevel::kError, "s", "quazor", "100%s");
   log_.write(LogLevel::kDefault, "s", "quazor", "two\nlines");
   log_.write(LogLevel::kDebug, "s", "other", "");
-  EXPECT_THAT(lines_, ElementsAre(Pair(LOG_ERR, "quazor: 100%s"), Pair(LOG_NOTICE, "quazor: two\nlines"),
-                                  Pair(LOG_DEBUG, "other: ")));
+  EXPECT_THAT(lines_, testing::ElementsAre(Pair(LOG_ERR, "quazor: 100%s"), Pair(LOG_NOTICE, "quazor: two\nlines"),
+                                           Pair(LOG_DEBUG, "other: ")));
 }
 
 TEST_F(SystemLogTest, AVeryLongTextIsCutBetweenCharacters) {

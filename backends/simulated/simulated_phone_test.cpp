@@ -3,6 +3,7 @@
 #include "backends/simulated/phone_for_tests.h"
 #include "backends/simulated/time/simulation_stall.h"
 #include "backends/threads/thread_concurrency.h"
+#include "tests/support/thrown_text.h"
 
 #include <gmock/gmock.h>
 #include <gtest/gtest.h>
@@ -16,7 +17,6 @@ namespace quazor {
 namespace {
 
 using namespace std::chrono_literals;
-using ::testing::ElementsAre;
 
 Fault fault(std::string operation, FaultAction action, std::optional<std::string> object = std::nullopt) {
   Fault fault;
@@ -26,7 +26,7 @@ Fault fault(std::string operation, FaultAction action, std::optional<std::string
   return fault;
 }
 
-// A clock that a test advances; it fails a sleep that would never end.
+// A clock that a test moves; it gives up a sleep that would never end.
 class SteppedClock final : public Clock {
  public:
   struct NeverEnds {};
@@ -76,9 +76,9 @@ TEST(SimulatedPhone, ObserversSeeEveryCallInOrder) {
     static_cast<void>(device->relinquishControlOfStreams({streams[1]}, nullptr));
     static_cast<void>(device->invalidate(nullptr));
   });
-  EXPECT_THAT(
-      calls,
-      ElementsAre("CaptureService.createPlugIn|||+", "CaptureService.defaultPlugIn|||+", "CapturePlugIn.device|||+",
+  EXPECT_THAT(calls,
+              testing::ElementsAre(
+                  "CaptureService.createPlugIn|||+", "CaptureService.defaultPlugIn|||+", "CapturePlugIn.device|||+",
                   "CaptureDevice.streams|||+", "CaptureDevice.synchronizedStreamsGroups|||+",
                   "SynchronizedStreamsGroup.streams|back||+", "CaptureDevice.requestControlOfStreams||(wide, (null))|-",
                   "CaptureDevice.requestControlOfStreams||(wide, tele)|+",
@@ -158,13 +158,8 @@ TEST(SimulatedPhone, AHangInVirtualTimeEndsTheWait) {
   const SimulatedPhone phone(scenario, PhoneTime::kVirtual, 1);
   const PhoneUser user(phone);
   phone.platform().clock->sleep(3s);
-  try {
-    static_cast<void>(user.wide().start(nullptr));
-    FAIL() << "the call returned";
-  } catch (const SimulationStall& stall) {
-    EXPECT_STREQ(stall.what(),
-                 "The simulated phone waits forever: CaptureStream.start of wide hangs, at 3 s of virtual time.");
-  }
+  EXPECT_EQ(thrownText<SimulationStall>([&] { return user.wide().start(nullptr); }),
+            "The simulated phone waits for ever: CaptureStream.start of wide hangs, at 3 s of virtual time.");
 }
 
 TEST(SimulatedPhone, AHangOnAnotherClockSleepsForEver) {

@@ -41,7 +41,6 @@ inline std::string nameOfActivity(RunLoopActivities activity) {
 template <class UnderTest>
 class RunLoopFixture : public ::testing::Test {
  protected:
-  using Words = std::vector<std::string>;
   using Source = std::shared_ptr<RunLoopSource>;
   using Observer = std::shared_ptr<RunLoopObserver>;
 
@@ -114,14 +113,24 @@ class RunLoopFixture : public ::testing::Test {
     queue_->asyncAfter(std::chrono::milliseconds(1), [work = std::move(function)] { work(); });
   }
 
-  Words takeWords() { return std::exchange(words_, {}); }
+  // The words since the last time: "first, second".
+  std::string takeWords() {
+    std::string taken;
+    for (const std::string& word : std::exchange(words_, {})) taken += (taken.empty() ? "" : ", ") + word;
+    return taken;
+  }
+  // The words of one turn that does not wait, and those before it.
+  std::string runOnceForWords(std::string_view mode = kDefault) {
+    runOnce(mode);
+    return takeWords();
+  }
 
   UnderTest under_test_;
   RunLoop& loop_ = under_test_.loop();
   std::shared_ptr<Clock> clock_ = under_test_.clock();
   std::shared_ptr<SerialQueue> queue_ =
       under_test_.concurrency()->makeSerialQueue("org.quazor.elsewhere", QualityOfService::kDefault);
-  Words words_;
+  std::vector<std::string> words_;
 
  private:
   std::vector<std::weak_ptr<RunLoopSource>> sources_;

@@ -1,6 +1,7 @@
 #include "base/json/json_document.h"
 
 #include "base/text/input_error.h"
+#include "tests/support/thrown_text.h"
 
 #include <gmock/gmock.h>
 #include <gtest/gtest.h>
@@ -44,18 +45,8 @@ TEST(LineOfPath, IsWhereTheKeyOrTheElementStands) {
   EXPECT_EQ(lineOfPath(kDocument, "nowhere"), std::nullopt);
 }
 
-template <class Call>
-std::string problemOfCall(const Call& call) {
-  try {
-    call();
-  } catch (const InputError& problem) {
-    return problem.what();
-  }
-  return "nothing";
-}
-
 std::string problemOf(const std::string& text) {
-  return problemOfCall([&] { JsonDocument(text, "a.json"); });
+  return thrownText<InputError>([&] { JsonDocument(text, "a.json"); });
 }
 
 TEST(JsonDocument, TellsTheLineOfWhatIsWrong) {
@@ -70,7 +61,7 @@ TEST(JsonDocument, TellsTheLineOfWhatIsWrong) {
 
 TEST(JsonDocument, SaysWhyAFileCannotBeRead) {
   const auto problemWith = [](const char* file) {
-    return problemOfCall([file] { static_cast<void>(JsonDocument::read(file)); });
+    return thrownText<InputError>([file] { static_cast<void>(JsonDocument::read(file)); });
   };
   EXPECT_THAT(problemWith("/dev/null"), testing::StartsWith("/dev/null:1: not valid JSON: "));
   EXPECT_EQ(problemWith("/proc/self/mem"), "/proc/self/mem: the file cannot be read.");
@@ -82,7 +73,7 @@ TEST(JsonDocument, SaysWhyAFileCannotBeRead) {
 TEST(JsonDocument, NamesTheLineWhereThePlaceIsInTheText) {
   JsonDocument document("{\n\"a\": 1}", "a.json");
   const auto problemAt = [&document](const std::string& path, const std::string& place) {
-    return problemOfCall([&] { document.fail(path, "sentence.", place); });
+    return thrownText<InputError>([&] { document.fail(path, "sentence.", place); });
   };
   EXPECT_EQ(problemAt("a", "a"), "a.json:2: a: sentence.");
   EXPECT_EQ(problemAt("", ""), "a.json:1: the document: sentence.");

@@ -1,6 +1,7 @@
 #include "base/text/hexadecimal.h"
 
 #include "base/text/input_error.h"
+#include "tests/support/thrown_text.h"
 
 #include <gmock/gmock.h>
 #include <gtest/gtest.h>
@@ -23,12 +24,9 @@ TEST(ParseHexadecimal, ReadsWhatHexadecimalWrote) {
 }
 
 TEST(ParseHexadecimal, RefusesEverythingElse) {
-  const struct {
-    const char* text;
-    const char* problem;
-  } kRows[] = {{"0", "odd number of hexadecimal digits"}, {"abc", "odd number of hexadecimal digits"},
-               {"0G", "invalid hexadecimal digit"},       {"g0", "invalid hexadecimal digit"},
-               {"A0", "invalid hexadecimal digit"},       {" 0", "invalid hexadecimal digit"}};
+  const RefusedText kRows[] = {{"0", "odd number of hexadecimal digits"}, {"abc", "odd number of hexadecimal digits"},
+                               {"0G", "invalid hexadecimal digit"},       {"g0", "invalid hexadecimal digit"},
+                               {"A0", "invalid hexadecimal digit"},       {" 0", "invalid hexadecimal digit"}};
   for (const auto& row : kRows) {
     EXPECT_THAT([&] { static_cast<void>(parseHexadecimal(row.text)); }, testing::ThrowsMessage<InputError>(row.problem))
         << row.text;

@@ -1,17 +1,35 @@
-// Complete runs on a simulated phone with failures after the cameras have been synchronised.
+// Whole runs on a simulated phone that fail, or stumble, once the cameras have been synchronised.
 #include "diagnostics/camera_sync/camera_sync_experiment.h"
 
+#include "contract/message_format.h"
+#include "tests/support/call_failures.h"
 #include "tests/sweeps/camera_sync_bench.h"
 
 #include <gtest/gtest.h>
 
+#include <cstddef>
+#include <iterator>
+#include <optional>
+#include <string>
+#include <vector>
+
 namespace quazor {
 namespace {
 
-constexpr const char* kStart = "CaptureStream.start";
-constexpr const char* kStop = "CaptureStream.stop";
+struct BackCamera {
+  const char* name;  // that the rows of a failure are called by
+  const char* id;
+  const char* port;
+  int format;
+};
+constexpr BackCamera kBackCameras[] = {{"TheFirst", "back-wide", "BackFacingCamera", 16},
+                                       {"TheMiddle", "back-tele", "BackFacingTelephotoCamera", 14},
+                                       {"TheLast", "back-super-wide", "BackFacingSuperWideCamera", 9}};
 
-// A rejected format index gives code 209; a rejected frame rate gives no error.
+constexpr const char* kStopped = "back-super-wide stop\nback-tele stop\nback-wide stop\n";
+constexpr const char* kGivenBack = "device relinquish control (back-wide, back-tele, back-super-wide)\n";
+
+// A refused format index: code 209; a refused frame rate: no error at all.
 class FailingConfiguration : public testing::TestWithParam<FaultRow> {};
 
 TEST_P(FailingConfiguration, IsToldExactly) {
@@ -20,68 +38,34 @@ TEST_P(FailingConfiguration, IsToldExactly) {
                       kHealthyBackRunWithoutMasterConfiguration);
 }
 
-const FaultRow kConfigurationRows[] = {
-    {"TheFirstFormat", {kSetStream, "back-wide", "FormatIndex"}, R"(back-wide set FormatIndex = 16 -> failed
-log error: Failed to set the format index to 16 on BackFacingCamera! {error}
-device relinquish control (back-wide, back-tele, back-super-wide)
-returned nothing
-error QZCapturePlugInErrorDomain code 209: Failed to set format index to 16{cause}
-)"},
-    {"TheFirstMinimum", {kSetStream, "back-wide", "MinimumFrameRate"}, R"(back-wide set MinimumFrameRate = 30 -> failed
-log error: Failed to set the min frame rate to 30 on BackFacingCamera! {error}
-device relinquish control (back-wide, back-tele, back-super-wide)
-returned nothing
-error emptied
-)"},
-    {"TheFirstMaximum", {kSetStream, "back-wide", "MaximumFrameRate"}, R"(back-wide set MaximumFrameRate = 30 -> failed
-log error: Failed to set the max frame rate to 30 on BackFacingCamera! {error}
-device relinquish control (back-wide, back-tele, back-super-wide)
-returned nothing
-error emptied
-)"},
-    {"TheMiddleFormat", {kSetStream, "back-tele", "FormatIndex"}, R"(back-tele set FormatIndex = 14 -> failed
-log error: Failed to set the format index to 14 on BackFacingTelephotoCamera! {error}
-device relinquish control (back-wide, back-tele, back-super-wide)
-returned nothing
-error QZCapturePlugInErrorDomain code 209: Failed to set format index to 14{cause}
-)"},
-    {"TheMiddleMinimum", {kSetStream, "back-tele", "MinimumFrameRate"}, R"(back-tele set MinimumFrameRate = 30 -> failed
-log error: Failed to set the min frame rate to 30 on BackFacingTelephotoCamera! {error}
-device relinquish control (back-wide, back-tele, back-super-wide)
-returned nothing
-error emptied
-)"},
-    {"TheMiddleMaximum", {kSetStream, "back-tele", "MaximumFrameRate"}, R"(back-tele set MaximumFrameRate = 30 -> failed
-log error: Failed to set the max frame rate to 30 on BackFacingTelephotoCamera! {error}
-device relinquish control (back-wide, back-tele, back-super-wide)
-returned nothing
-error emptied
-)"},
-    {"TheLastFormat", {kSetStream, "back-super-wide", "FormatIndex"}, R"(back-super-wide set FormatIndex = 9 -> failed
-log error: Failed to set the format index to 9 on BackFacingSuperWideCamera! {error}
-device relinquish control (back-wide, back-tele, back-super-wide)
-returned nothing
-error QZCapturePlugInErrorDomain code 209: Failed to set format index to 9{cause}
-)"},
-    {"TheLastMinimum",
-     {kSetStream, "back-super-wide", "MinimumFrameRate"},
-     R"(back-super-wide set MinimumFrameRate = 30 -> failed
-log error: Failed to set the min frame rate to 30 on BackFacingSuperWideCamera! {error}
-device relinquish control (back-wide, back-tele, back-super-wide)
-returned nothing
-error emptied
-)"},
-    {"TheLastMaximum",
-     {kSetStream, "back-super-wide", "MaximumFrameRate"},
-     R"(back-super-wide set MaximumFrameRate = 30 -> failed
-log error: Failed to set the max frame rate to 30 on BackFacingSuperWideCamera! {error}
-device relinquish control (back-wide, back-tele, back-super-wide)
-returned nothing
-error emptied
-)"},
-};
+std::vector<FaultRow> configurationRows() {
+  std::vector<FaultRow> rows;
+  for (const BackCamera& camera : kBackCameras) {
+    const std::string format = std::to_string(camera.format);
+    const struct {
+      const char* name;
+      const char* key;
+      const char* words;
+      std::string value;
+      std::string error;
+    } settings[] = {
+        {"Format", "FormatIndex", "format index", format,
+         "error QZCapturePlugInErrorDomain code 209: Failed to set format index to " + format + "{cause}\n"},
+        {"Minimum", "MinimumFrameRate", "min frame rate", "30", "error emptied\n"},
+        {"Maximum", "MaximumFrameRate", "max frame rate", "30", "error emptied\n"},
+    };
+    for (const auto& setting : settings) {
+      rows.push_back({std::string(camera.name) + setting.name,
+                      {kSetStream, camera.id, setting.key},
+                      formatMessage("%@ set %@ = %@ -> failed\nlog error: Failed to set the %@ to %@ on %@! {error}\n",
+                                    camera.id, setting.key, setting.value, setting.words, setting.value, camera.port) +
+                          kGivenBack + "returned nothing\n" + setting.error});
+    }
+  }
+  return rows;
+}
 
-INSTANTIATE_TEST_SUITE_P(CameraSyncExperiment, FailingConfiguration, testing::ValuesIn(kConfigurationRows), nameOf);
+INSTANTIATE_TEST_SUITE_P(CameraSyncExperiment, FailingConfiguration, testing::ValuesIn(configurationRows()), nameOf);
 
 class FailingStream : public testing::TestWithParam<FaultRow> {};
 
@@ -90,102 +74,62 @@ TEST_P(FailingStream, IsToldExactly) {
 }
 
 // All streams are stopped, those that never started too; the phone refuses to stop these.
+std::vector<FaultRow> startRows() {
+  std::vector<FaultRow> rows;
+  for (std::size_t failing = 0; failing < std::size(kBackCameras); ++failing) {
+    const BackCamera& camera = kBackCameras[failing];
+    const std::string message = formatMessage("Failed to start steam at %@ port! {error}", camera.port);
+    std::string stops;
+    for (std::size_t i = std::size(kBackCameras); i-- > 0;) {
+      stops += std::string(kBackCameras[i].id) + (i >= failing ? " stop -> failed\n" : " stop\n");
+    }
+    rows.push_back({std::string(camera.name) + "Start",
+                    {"CaptureStream.start", camera.id},
+                    formatMessage("%@ start -> failed\nlog error: %@\n", camera.id, message) + stops + kGivenBack +
+                        "returned nothing\nerror QZCapturePlugInErrorDomain code 204: " + message + "{cause}\n"});
+  }
+  return rows;
+}
+
+std::vector<FaultRow> errorCountersRows() {
+  std::vector<FaultRow> rows;
+  for (const BackCamera& camera : kBackCameras) {
+    rows.push_back(
+        {std::string(camera.name) + "ErrorCounters",
+         {kReadStream, camera.id, "ErrorCounters"},
+         formatMessage("%@ get ErrorCounters -> failed\n"
+                       "log error: Failed to get error counters of steam at %@ port! {error}\n",
+                       camera.id, camera.port) +
+             kStopped + kGivenBack + "returned nothing\n" +
+             formatMessage("error QZCapturePlugInErrorDomain code 210: No error counters for port %@!{cause}\n",
+                           camera.port)});
+  }
+  return rows;
+}
+
+// A stream that did not stop cannot be given back; there is a result all the same.
+FaultRow stopRow(const char* name, const char* camera, const char* laterStops) {
+  return {name,
+          {"CaptureStream.stop", camera},
+          formatMessage("%@ stop -> failed\nlog error: Failed to stop steam! {error}\n%@"
+                        "device relinquish control (back-wide, back-tele, back-super-wide) -> failed\n"
+                        "log error: Failed to relinquish steam! SimulatedCaptureErrorDomain code 10: %@ is running; "
+                        "stop it before giving it back.\n",
+                        camera, laterStops, camera),
+          "returned a result"};
+}
+
 const FaultRow kStreamingRows[] = {
-    {"TheFirstStart", {kStart, "back-wide"}, R"(back-wide start -> failed
-log error: Failed to start steam at BackFacingCamera port! {error}
-back-super-wide stop -> failed
-back-tele stop -> failed
-back-wide stop -> failed
-device relinquish control (back-wide, back-tele, back-super-wide)
-returned nothing
-error QZCapturePlugInErrorDomain code 204: Failed to start steam at BackFacingCamera port! {error}{cause}
-)"},
-    {"TheMiddleStart", {kStart, "back-tele"}, R"(back-tele start -> failed
-log error: Failed to start steam at BackFacingTelephotoCamera port! {error}
-back-super-wide stop -> failed
-back-tele stop -> failed
-back-wide stop
-device relinquish control (back-wide, back-tele, back-super-wide)
-returned nothing
-error QZCapturePlugInErrorDomain code 204: Failed to start steam at BackFacingTelephotoCamera port! {error}{cause}
-)"},
-    {"TheLastStart", {kStart, "back-super-wide"}, R"(back-super-wide start -> failed
-log error: Failed to start steam at BackFacingSuperWideCamera port! {error}
-back-super-wide stop -> failed
-back-tele stop
-back-wide stop
-device relinquish control (back-wide, back-tele, back-super-wide)
-returned nothing
-error QZCapturePlugInErrorDomain code 204: Failed to start steam at BackFacingSuperWideCamera port! {error}{cause}
-)"},
     {"TheSessionStatus",
      {"CaptureDevice.valueForProperty", std::nullopt, "MulticamSessionStatus"},
-     R"(device get MulticamSessionStatus -> failed
-back-super-wide stop
-back-tele stop
-back-wide stop
-device relinquish control (back-wide, back-tele, back-super-wide)
-log error: Failed to copy session status! {error}
+     std::string("device get MulticamSessionStatus -> failed\n") + kStopped + kGivenBack +
+         R"(log error: Failed to copy session status! {error}
 returned nothing
 error QZCapturePlugInErrorDomain code 215: Failed to copy sesison status!{cause}
 )"},
-    {"TheFirstErrorCounters", {kReadStream, "back-wide", "ErrorCounters"}, R"(back-wide get ErrorCounters -> failed
-log error: Failed to get error counters of steam at BackFacingCamera port! {error}
-back-super-wide stop
-back-tele stop
-back-wide stop
-device relinquish control (back-wide, back-tele, back-super-wide)
-returned nothing
-error QZCapturePlugInErrorDomain code 210: No error counters for port BackFacingCamera!{cause}
-)"},
-    {"TheMiddleErrorCounters", {kReadStream, "back-tele", "ErrorCounters"}, R"(back-tele get ErrorCounters -> failed
-log error: Failed to get error counters of steam at BackFacingTelephotoCamera port! {error}
-back-super-wide stop
-back-tele stop
-back-wide stop
-device relinquish control (back-wide, back-tele, back-super-wide)
-returned nothing
-error QZCapturePlugInErrorDomain code 210: No error counters for port BackFacingTelephotoCamera!{cause}
-)"},
-    {"TheLastErrorCounters",
-     {kReadStream, "back-super-wide", "ErrorCounters"},
-     R"(back-super-wide get ErrorCounters -> failed
-log error: Failed to get error counters of steam at BackFacingSuperWideCamera port! {error}
-back-super-wide stop
-back-tele stop
-back-wide stop
-device relinquish control (back-wide, back-tele, back-super-wide)
-returned nothing
-error QZCapturePlugInErrorDomain code 210: No error counters for port BackFacingSuperWideCamera!{cause}
-)"},
-    // A stream that did not stop cannot be given back; there is a result all the same.
-    {"TheFirstStop",
-     {kStop, "back-super-wide"},
-     R"(back-super-wide stop -> failed
-log error: Failed to stop steam! {error}
-back-tele stop
-back-wide stop
-device relinquish control (back-wide, back-tele, back-super-wide) -> failed
-log error: Failed to relinquish steam! SimulatedCaptureErrorDomain code 10: back-super-wide is running; stop it before releasing control.
-)",
-     "returned a result"},
-    {"TheMiddleStop",
-     {kStop, "back-tele"},
-     R"(back-tele stop -> failed
-log error: Failed to stop steam! {error}
-back-wide stop
-device relinquish control (back-wide, back-tele, back-super-wide) -> failed
-log error: Failed to relinquish steam! SimulatedCaptureErrorDomain code 10: back-tele is running; stop it before releasing control.
-)",
-     "returned a result"},
-    {"TheLastStop",
-     {kStop, "back-wide"},
-     R"(back-wide stop -> failed
-log error: Failed to stop steam! {error}
-device relinquish control (back-wide, back-tele, back-super-wide) -> failed
-log error: Failed to relinquish steam! SimulatedCaptureErrorDomain code 10: back-wide is running; stop it before releasing control.
-)",
-     "returned a result"},
+    stopRow("TheFirstStop", "back-super-wide", "back-tele stop\nback-wide stop\n"),
+    stopRow("TheMiddleStop", "back-tele", "back-wide stop\n"),
+    stopRow("TheLastStop", "back-wide", ""),
     {"TheGivingBack",
      {"CaptureDevice.relinquishControlOfStreams"},
      R"(device relinquish control (back-wide, back-tele, back-super-wide) -> failed
@@ -194,34 +138,22 @@ log error: Failed to relinquish steam! {error}
      "returned a result"},
 };
 
+INSTANTIATE_TEST_SUITE_P(Starts, FailingStream, testing::ValuesIn(startRows()), nameOf);
+INSTANTIATE_TEST_SUITE_P(ErrorCounters, FailingStream, testing::ValuesIn(errorCountersRows()), nameOf);
 INSTANTIATE_TEST_SUITE_P(CameraSyncExperiment, FailingStream, testing::ValuesIn(kStreamingRows), nameOf);
 
 TEST(CameraSyncExperiment, FailsAtTheFirstCameraThatTheStatusLeavesOut) {
-  const struct {
-    const char* camera;
-    const char* line;  // of the healthy run, where it goes wrong
-    std::string told;
-  } rows[] = {
-      {"back-wide", "back-wide get ErrorCounters", "log error: No status available for port BackFacingCamera\n"},
-      {"back-tele", "back-tele get ErrorCounters",
-       "log error: No status available for port BackFacingTelephotoCamera\n"},
-      {"back-super-wide", "back-super-wide get ErrorCounters",
-       "log error: No status available for port BackFacingSuperWideCamera\n"},
-  };
-  for (const auto& row : rows) {
-    SCOPED_TRACE(row.camera);
+  for (const BackCamera& camera : kBackCameras) {
+    SCOPED_TRACE(camera.id);
     Scenario scenario = cameraSyncScenario();
-    cameraOf(scenario, row.camera).inSessionStatus = false;
-    const std::string& port = cameraOf(scenario, row.camera).port;
-    expectTold(healthyUpTo(kHealthyBackRun, row.line,
-                           row.told + R"(back-super-wide stop
-back-tele stop
-back-wide stop
-device relinquish control (back-wide, back-tele, back-super-wide)
-returned nothing
-error QZCapturePlugInErrorDomain code 215: Status for port )" +
-                               port + " not available!\n"),
-               Side::kBack, scenario);
+    cameraOf(scenario, camera.id).inSessionStatus = false;
+    expectTold(
+        healthyUpTo(kHealthyBackRun, camera.id + std::string(" get ErrorCounters"),
+                    formatMessage("log error: No status available for port %@\n", camera.port) + kStopped + kGivenBack +
+                        formatMessage("returned nothing\n"
+                                      "error QZCapturePlugInErrorDomain code 215: Status for port %@ not available!\n",
+                                      camera.port)),
+        Side::kBack, scenario);
   }
 }
 
@@ -243,41 +175,22 @@ log default: BackFacingSuperWideCamera
   Total: 60
   ErrorCounters: {I2CErrorCount = 33}
 
-back-super-wide stop
-back-tele stop
-back-wide stop
-device relinquish control (back-wide, back-tele, back-super-wide)
-returned nothing
-error emptied
-)"),
+)" + std::string(kStopped) + kGivenBack +
+                             "returned nothing\nerror emptied\n"),
              Side::kBack, scenario);
 }
 
 TEST(CameraSyncExperiment, MeasuresDroppedFramesAsTheyCome) {
   Scenario scenario = cameraSyncScenario();
   cameraOf(scenario, "front-infrared").droppedFrames = {0, 5, 6};
-  expectTold(healthyUpTo(kHealthyFrontRun, "log default: FrontFacingInfraredCamera",
-                         R"(log default: FrontFacingInfraredCamera
-  Offset: 3
-  Frames: 54
-  Total: 57
-  ErrorCounters: {I2CErrorCount = 55}
-
-front-infrared stop
-front stop
-device relinquish control (front, front-infrared)
-returned a result
-error untouched
-Front.FrameOffset = 0 frames
-Front.Frames = 60 frames
-FrontInfrared.FrameOffset = 3 frames
-FrontInfrared.Frames = 54 frames
-ErrorCounters = {Front = {I2CErrorCount = 44}; FrontInfrared = {I2CErrorCount = 55}}
-)"),
-             Side::kFront, scenario);
+  std::string told = kHealthyFrontRun;
+  replaceAll(told, "  Frames: 57\n  Total: 60\n", "  Frames: 54\n  Total: 57\n");
+  replaceAll(told, "FrontInfrared.Frames = 57 frames", "FrontInfrared.Frames = 54 frames");
+  EXPECT_NE(told, kHealthyFrontRun);
+  expectTold(told, Side::kFront, scenario);
 }
 
-// A rejection by the phone is reported like an injected fault.
+// What the phone itself refuses is told as what a fault refuses.
 TEST(CameraSyncExperiment, TellsThePhonesOwnRefusals) {
   Scenario scenario = cameraSyncScenario();
   cameraOf(scenario, "back-tele").formats.resize(14);

@@ -16,6 +16,16 @@ TEST(CameraSyncExperiment, ConfiguresEverySlaveByItselfWhereTheMasterCannot) {
   expectTold(kHealthyBackRunWithoutMasterConfiguration, Side::kBack, withoutMasterConfiguration(cameraSyncScenario()));
 }
 
+std::string notSynchronized() {
+  return "returned nothing\nerror QZCapturePlugInErrorDomain code 214: Failed to synchronize cameras!\n";
+}
+std::string noGroup() {
+  return "front-cameras get streams\n"
+         "log error: Failed to find appropriate group for ports (BackFacingCamera, BackFacingTelephotoCamera, "
+         "BackFacingSuperWideCamera)!\n" +
+         notSynchronized();
+}
+
 constexpr const char* kReadGroup = "SynchronizedStreamsGroup.valueForProperty";
 constexpr const char* kSetGroup = "SynchronizedStreamsGroup.setValue";
 
@@ -38,17 +48,11 @@ error QZCapturePlugInErrorDomain code 200: Failed to create capture device!{caus
 )"},
     {"TheDeviceTellsNoGroups", {"CaptureDevice.synchronizedStreamsGroups"}, R"(device get groups -> failed
 log error: Failed to copy groups from device! {error}
-returned nothing
-error QZCapturePlugInErrorDomain code 214: Failed to synchronize cameras!
-)"},
+)" + notSynchronized()},
     {"TheGroupTellsNoStreams",
      {"SynchronizedStreamsGroup.streams", "back-cameras"},
      R"(back-cameras get streams -> failed
-front-cameras get streams
-log error: Failed to find appropriate group for ports (BackFacingCamera, BackFacingTelephotoCamera, BackFacingSuperWideCamera)!
-returned nothing
-error QZCapturePlugInErrorDomain code 214: Failed to synchronize cameras!
-)"},
+)" + noGroup()},
     {"TheFirstStreamTellsNoPort", {kReadStream, "back-wide", "PortType", 1}, R"(back-wide get PortType -> failed
 back-tele get PortType
 back-super-wide get PortType
@@ -57,11 +61,7 @@ back-tele get PortType
 back-wide get PortType
 back-tele get PortType
 back-super-wide get PortType
-front-cameras get streams
-log error: Failed to find appropriate group for ports (BackFacingCamera, BackFacingTelephotoCamera, BackFacingSuperWideCamera)!
-returned nothing
-error QZCapturePlugInErrorDomain code 214: Failed to synchronize cameras!
-)"},
+)" + noGroup()},
     {"TheFirstStreamTellsNoPortWhenTheSecondIsLookedFor",
      {kReadStream, "back-wide", "PortType", 2},
      "back-wide get PortType -> failed\n",
@@ -71,47 +71,31 @@ back-super-wide get PortType
 back-wide get PortType
 back-tele get PortType
 back-super-wide get PortType
-front-cameras get streams
-log error: Failed to find appropriate group for ports (BackFacingCamera, BackFacingTelephotoCamera, BackFacingSuperWideCamera)!
-returned nothing
-error QZCapturePlugInErrorDomain code 214: Failed to synchronize cameras!
-)"},
+)" + noGroup()},
     {"TheLastStreamTellsNoPort",
      {kReadStream, "back-super-wide", "PortType", 1},
      R"(back-super-wide get PortType -> failed
-front-cameras get streams
-log error: Failed to find appropriate group for ports (BackFacingCamera, BackFacingTelephotoCamera, BackFacingSuperWideCamera)!
-returned nothing
-error QZCapturePlugInErrorDomain code 214: Failed to synchronize cameras!
-)"},
+)" + noGroup()},
     {"ControlIsRefused",
      {"CaptureDevice.requestControlOfStreams"},
      R"(device request control (back-wide, back-tele, back-super-wide) -> failed
 log error: Failed to request control streams (BackFacingCamera, BackFacingTelephotoCamera, BackFacingSuperWideCamera)! {error}
-returned nothing
-error QZCapturePlugInErrorDomain code 214: Failed to synchronize cameras!
-)"},
+)" + notSynchronized()},
     {"TheActiveStreamsAreRefused",
      {kSetGroup, "back-cameras", "ActiveStreams"},
      R"(back-cameras set ActiveStreams = (stream back-wide (BackFacingCamera), stream back-tele (BackFacingTelephotoCamera), stream back-super-wide (BackFacingSuperWideCamera)) -> failed
 log error: Failed to set the active streams {error}!
-returned nothing
-error QZCapturePlugInErrorDomain code 214: Failed to synchronize cameras!
-)"},
+)" + notSynchronized()},
     {"TheMasterIsNotTold",
      {kReadGroup, "back-cameras", "SynchronizationMaster"},
      R"(back-cameras get SynchronizationMaster -> failed
 log error: The sync master port must be provided first!
-returned nothing
-error QZCapturePlugInErrorDomain code 214: Failed to synchronize cameras!
-)"},
+)" + notSynchronized()},
     {"TheGroupIsRefused",
      {"CaptureDevice.setValue", std::nullopt, "MultiCamConfiguration"},
      R"(device set MultiCamConfiguration = {ActiveSynchronizedStreamsGroups = (group back-cameras)} -> failed
 log error: Failed to set the multicam config! {error}
-returned nothing
-error QZCapturePlugInErrorDomain code 214: Failed to synchronize cameras!
-)"},
+)" + notSynchronized()},
     {"TheFirstStreamRefusesMultipleOutputs",
      {kSetStream, "back-wide", "MultipleOutputSupportEnabled"},
      R"(back-wide set MultipleOutputSupportEnabled = 1 -> failed
@@ -139,25 +123,13 @@ back-cameras set MasterConfiguration = {SlaveConfigurationByPortType = {BackFaci
      "back-wide set FormatIndex = 16"},
     {"TheSupportedKeysAreNotTold",
      {kReadGroup, "back-cameras", "MasterConfigurationSupportedKeys"},
-     R"(back-cameras get MasterConfigurationSupportedKeys -> failed
-log default: Device does not support SlaveConfigurationByPortType, using SynchronizedStreamsSlaveConfiguration instead.
-back-wide get PortType
-back-tele get PortType
-back-tele set SynchronizedStreamsSlaveConfiguration = {StreamingOutputsEnabled = 1; FrameSkippingEnabled = 0; TimeMachineEnabled = 0; MasterToSlaveFrameRateRatio = 1}
-back-super-wide get PortType
-back-wide get PortType
-back-tele get PortType
-back-super-wide get PortType
-back-super-wide set SynchronizedStreamsSlaveConfiguration = {StreamingOutputsEnabled = 1; FrameSkippingEnabled = 0; TimeMachineEnabled = 0; MasterToSlaveFrameRateRatio = 1}
-)",
+     std::string("back-cameras get MasterConfigurationSupportedKeys -> failed\n") + kSlavesConfiguredByThemselves,
      "back-wide set FormatIndex = 16"},
     {"TheMasterConfigurationIsRefused",
      {kSetGroup, "back-cameras", "MasterConfiguration"},
      R"(back-cameras set MasterConfiguration = {SlaveConfigurationByPortType = {BackFacingTelephotoCamera = {StreamingOutputsEnabled = 1; FrameSkippingEnabled = 0; TimeMachineEnabled = 0; MasterToSlaveFrameRateRatio = 1}; BackFacingSuperWideCamera = {StreamingOutputsEnabled = 1; FrameSkippingEnabled = 0; TimeMachineEnabled = 0; MasterToSlaveFrameRateRatio = 1}}} -> failed
 log error: Failed to set the slave config! {error}
-returned nothing
-error QZCapturePlugInErrorDomain code 214: Failed to synchronize cameras!
-)"},
+)" + notSynchronized()},
 };
 
 INSTANTIATE_TEST_SUITE_P(CameraSyncExperiment, FailingSynchronization, testing::ValuesIn(kSynchronizationRows), nameOf);
@@ -204,16 +176,12 @@ back-super-wide set SynchronizedStreamsSlaveConfiguration = {StreamingOutputsEna
      {kSetStream, "back-tele", "SynchronizedStreamsSlaveConfiguration"},
      R"(back-tele set SynchronizedStreamsSlaveConfiguration = {StreamingOutputsEnabled = 1; FrameSkippingEnabled = 0; TimeMachineEnabled = 0; MasterToSlaveFrameRateRatio = 1} -> failed
 log error: Failed to set the slave config! {error}
-returned nothing
-error QZCapturePlugInErrorDomain code 214: Failed to synchronize cameras!
-)"},
+)" + notSynchronized()},
     {"TheLastSlaveRefusesItsConfiguration",
      {kSetStream, "back-super-wide", "SynchronizedStreamsSlaveConfiguration"},
      R"(back-super-wide set SynchronizedStreamsSlaveConfiguration = {StreamingOutputsEnabled = 1; FrameSkippingEnabled = 0; TimeMachineEnabled = 0; MasterToSlaveFrameRateRatio = 1} -> failed
 log error: Failed to set the slave config! {error}
-returned nothing
-error QZCapturePlugInErrorDomain code 214: Failed to synchronize cameras!
-)"},
+)" + notSynchronized()},
 };
 
 INSTANTIATE_TEST_SUITE_P(CameraSyncExperiment, FailingSlaveConfiguration, testing::ValuesIn(kSlaveConfigurationRows),
@@ -224,10 +192,7 @@ TEST(CameraSyncExperiment, FailsWhenTheMasterIsNotTheFirstPort) {
   scenario.groups.front().master = "back-super-wide";
   expectTold(healthyUpTo(kHealthyBackRun,
                          "device set MultiCamConfiguration = {ActiveSynchronizedStreamsGroups = (group back-cameras)}",
-                         R"(log error: The sync master port must be provided first!
-returned nothing
-error QZCapturePlugInErrorDomain code 214: Failed to synchronize cameras!
-)"),
+                         "log error: The sync master port must be provided first!\n" + notSynchronized()),
              Side::kBack, scenario);
 }
 
@@ -242,11 +207,7 @@ back-tele get PortType
 front get PortType
 back-wide get PortType
 back-tele get PortType
-front-cameras get streams
-log error: Failed to find appropriate group for ports (BackFacingCamera, BackFacingTelephotoCamera, BackFacingSuperWideCamera)!
-returned nothing
-error QZCapturePlugInErrorDomain code 214: Failed to synchronize cameras!
-)"),
+)" + noGroup()),
              Side::kBack, scenario);
 }
 

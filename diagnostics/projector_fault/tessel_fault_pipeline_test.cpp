@@ -84,39 +84,29 @@ constexpr const char* kCsvHeader =
 constexpr const char* kFrameError =
     "log debug: We are stopping because there was an error. If stopping the stream fails, it will be ignored.\n";
 
-constexpr const char* kEnd = R"(afterwards
-log error: Timeout has been reached.
-device invalidate
-torn down
-error untouched
-)";
-
-TEST(TesselFaultPipeline, EndsWithAFrameThatIsDarkForSafety) {
-  EXPECT_EQ(toldOfFrames(withFrame(2, unlitFrameForSafety())),
-            std::string(kFirstFrame) + "log debug: Processing frame 2.\nlog debug: " + kCsvHeader +
-                "\n2,2026-01-01 00:00:00 +0000,0.066667,2,0,0,210,640,0,1,205,207,1.5,33.5,31.25,32,36.5,32.5,33.25,41,"
-                "8192\n\n"
-                "log error: Frame 2 failed projection validation.\n"
-                "front-infrared get ErrorCounters\n"
-                "front-infrared stop\n" +
-                kFrameError +
-                "returned nothing\n"
-                "error QZCapturePlugInErrorDomain code 213: Frame 2 is not illuminated for safety reason!\n" +
-                kEnd + "buffers held: none\n");
+std::string endAfterTimeout(const std::string& held = "none") {
+  return "afterwards\nlog error: Timeout has been reached.\n" + toldEnd(held);
 }
 
-TEST(TesselFaultPipeline, EndsWithAFrameThatIsDarkForNoKnownReason) {
-  EXPECT_EQ(toldOfFrames(withFrame(2, unlitFrame())),
-            std::string(kFirstFrame) + "log debug: Processing frame 2.\nlog debug: " + kCsvHeader +
-                "\n2,2026-01-01 00:00:00 +0000,0.066667,2,0,0,210,640,0,1,205,207,1.5,33.5,31.25,32,36.5,32.5,33.25,41,"
-                "0\n\n"
-                "log error: Frame 2 failed projection validation.\n"
-                "front-infrared get ErrorCounters\n"
-                "front-infrared stop\n" +
-                kFrameError +
-                "returned nothing\n"
-                "error QZCapturePlugInErrorDomain code 206: Frame 2 is not illuminated for unknown reason!\n" +
-                kEnd + "buffers held: none\n");
+TEST(TesselFaultPipeline, EndsWithAFrameThatIsDark) {
+  const struct {
+    FrameMetadata metadata;
+    const char* hardwareEvents;
+    const char* error;
+  } rows[] = {
+      {unlitFrameForSafety(), "8192", "code 213: Frame 2 is not illuminated for safety reason!\n"},
+      {unlitFrame(), "0", "code 206: Frame 2 is not illuminated for unknown reason!\n"},
+  };
+  for (const auto& row : rows) {
+    EXPECT_EQ(toldOfFrames(withFrame(2, row.metadata)),
+              std::string(kFirstFrame) + "log debug: Processing frame 2.\nlog debug: " + kCsvHeader +
+                  "\n2,2026-01-01 00:00:00 +0000,0.066667,2,0,0,210,640,0,1,205,207,1.5,33.5,31.25,32,36.5,32.5,33.25,"
+                  "41," +
+                  row.hardwareEvents +
+                  "\n\nlog error: Frame 2 failed projection validation.\n"
+                  "front-infrared get ErrorCounters\nfront-infrared stop\n" +
+                  kFrameError + "returned nothing\nerror QZCapturePlugInErrorDomain " + row.error + endAfterTimeout());
+  }
 }
 
 // The last frame is examined like every other, and its error takes precedence over its number.
@@ -147,8 +137,8 @@ class BadFrame : public testing::TestWithParam<BadMetadata> {};
 TEST_P(BadFrame, EndsTheRun) {
   EXPECT_EQ(toldOfFrames(withFrame(2, GetParam().metadata)),
             std::string(kFirstFrame) + "front-infrared get ErrorCounters\nfront-infrared stop\n" + kFrameError +
-                "returned nothing\nerror QZCapturePlugInErrorDomain code 206: " + GetParam().message + '\n' + kEnd +
-                "buffers held: front-infrared 2\n");
+                "returned nothing\nerror QZCapturePlugInErrorDomain code 206: " + GetParam().message + '\n' +
+                endAfterTimeout("front-infrared 2"));
 }
 
 INSTANTIATE_TEST_SUITE_P(
@@ -243,24 +233,7 @@ TEST(TesselFaultPipeline, EndsWithTheFirstFrameWhenAskedForNone) {
 log debug: Received frame 1.
 log debug: Processing frame 1.
 log debug: Frame 1 is the last frame.
-front-infrared get ErrorCounters
-front-infrared stop
-ReportChannelSet snapshot
-ReportSnapshot snapshotWithBaseline
-returned a result
-error untouched
-FrameCount = 1 frames
-I2C = 1 errors
-MIPI = 2 errors
-LPDP = 3 errors
-UART = 4 errors
-SIF = 5 errors
-Projector = 6 errors
-Number ZE FAULT_A = 2 events
-Number ZE FAULT_C = 5 events
-Number Fenk NTC = 0 events
-Number Dwna NTC = 0 events
-)" + std::string(kEnd) + "buffers held: none\n");
+)" + toldResult(1, 2, 5) + endAfterTimeout());
   }
 }
 
@@ -270,55 +243,12 @@ TEST(TesselFaultPipeline, EndsAtTheTimeoutWithTheFramesThatCame) {
   request.timeout = 0.08;
   EXPECT_EQ(toldOfFrames(projectorScenario(), request), std::string(kFirstFrame) + R"(log debug: Processing frame 2.
 log error: Timeout has been reached.
-front-infrared get ErrorCounters
-front-infrared stop
-ReportChannelSet snapshot
-ReportSnapshot snapshotWithBaseline
-returned a result
-error untouched
-FrameCount = 2 frames
-I2C = 1 errors
-MIPI = 2 errors
-LPDP = 3 errors
-UART = 4 errors
-SIF = 5 errors
-Projector = 6 errors
-Number ZE FAULT_A = 2 events
-Number ZE FAULT_C = 5 events
-Number Fenk NTC = 0 events
-Number Dwna NTC = 0 events
-afterwards
-device invalidate
-torn down
-error untouched
-buffers held: none
-)");
+)" + toldResult(2, 2, 5) + "afterwards\n" + toldEnd());
 }
 
-constexpr const char* kEndAtOnce = R"(log error: Timeout has been reached.
-front-infrared get ErrorCounters
-front-infrared stop
-ReportChannelSet snapshot
-ReportSnapshot snapshotWithBaseline
-returned a result
-error untouched
-FrameCount = 0 frames
-I2C = 1 errors
-MIPI = 2 errors
-LPDP = 3 errors
-UART = 4 errors
-SIF = 5 errors
-Projector = 6 errors
-Number ZE FAULT_A = 0 events
-Number ZE FAULT_C = 0 events
-Number Fenk NTC = 0 events
-Number Dwna NTC = 0 events
-afterwards
-device invalidate
-torn down
-error untouched
-buffers held: none
-)";
+const std::string kEndAtOnce = R"(log error: Timeout has been reached.
+)" + toldResult(0, 0, 0) + "afterwards\n" +
+                               toldEnd();
 
 TEST(TesselFaultPipeline, EndsAtOnceWithoutTimeToWait) {
   for (const Value& timeout : {Value(0), Value(-0.0), Value(0.9e-9), Value(std::numeric_limits<double>::quiet_NaN()),

@@ -21,9 +21,7 @@ namespace {
 class TesselFaultRunEdges : public testing::Test {
  protected:
   std::shared_ptr<QZTesselFaultExperiment> makeExperiment(std::string_view port) {
-    phone.observeCalls([this](const PlatformCall& call) {
-      transcript.addCall(call.operation, call.object, call.detail, call.succeeded);
-    });
+    phone.observeCalls(addingTo(transcript));
     return std::make_shared<QZTesselFaultExperiment>(std::string(port), phone.platform());
   }
   std::string run(QZTesselFaultExperiment& experiment) {

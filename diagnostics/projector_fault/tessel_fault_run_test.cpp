@@ -40,30 +40,8 @@ log debug: Processing frame 2.
 log debug: Received frame 3.
 log debug: Processing frame 3.
 log debug: Frame 3 is the last frame.
-front-infrared get ErrorCounters
-front-infrared stop
-ReportChannelSet snapshot
-ReportSnapshot snapshotWithBaseline
-returned a result
-error untouched
-FrameCount = 3 frames
-I2C = 1 errors
-MIPI = 2 errors
-LPDP = 3 errors
-UART = 4 errors
-SIF = 5 errors
-Projector = 6 errors
-Number ZE FAULT_A = 2 events
-Number ZE FAULT_C = 5 events
-Number Fenk NTC = 0 events
-Number Dwna NTC = 0 events
-afterwards
-log error: Timeout has been reached.
-device invalidate
-torn down
-error untouched
-buffers held: none
-)";
+)" + toldResult(3, 2, 5) + "afterwards\nlog error: Timeout has been reached.\n" +
+                                toldEnd();
 
 constexpr const char* kTimeoutLater = "log error: Timeout has been reached.\n";
 // A stream whose stop failed continues until the device is invalidated.
@@ -84,7 +62,7 @@ struct FailingStep {
   const char* error;  // the resulting error; {cause} is replaced by the error of the call
   const char* underway = "";
   const char* afterwards = "";
-  const char* teardown = "device invalidate\ntorn down\nerror untouched\n";
+  const char* teardown = kTornDown;
   const char* held = "none";
 };
 void PrintTo(const FailingStep& step, std::ostream* out) { *out << step.name; }
@@ -143,27 +121,13 @@ const FailingStep kSteps[] = {
      kTimeoutLater},
     {"TheStreamDoesNotStop", "CaptureStream.stop", std::nullopt, 1, "front-infrared stop",
      "QZCapturePlugInErrorDomain code 205: Failed to stop stream!",
-     "log debug: There was an error stopping the stream.\n", kFramesAndTimeoutLater,
-     "device invalidate\ntorn down\nerror untouched\n", "front-infrared 4, 5, 6, 7"},
+     "log debug: There was an error stopping the stream.\n", kFramesAndTimeoutLater, kTornDown,
+     "front-infrared 4, 5, 6, 7"},
     {"ThereIsNoSnapshotAfter", "ReportChannelSet.snapshot", std::nullopt, 2, "ReportChannelSet snapshot",
      "QZTelemonErrorDomain code 100: Cannot get Telemon delta after streaming.{cause}", "", kTimeoutLater},
     {"ThereIsNoDelta", "ReportSnapshot.snapshotWithBaseline", std::nullopt, 1, "ReportSnapshot snapshotWithBaseline",
      "QZTelemonErrorDomain code 100: Cannot get Telemon delta after streaming.{cause}", "", kTimeoutLater},
 };
-
-void replaceAll(std::string& text, std::string_view from, std::string_view to) {
-  for (std::size_t at = text.find(from); at != std::string::npos; at = text.find(from, at + to.size())) {
-    text.replace(at, from.size(), to);
-  }
-}
-
-// What is told to a caller without a place for errors.
-std::string toldWithoutPlace(std::string told) {
-  for (std::size_t at = told.find("\nerror "); at != std::string::npos; at = told.find("\nerror ", at + 1)) {
-    told.replace(at + 1, told.find('\n', at + 1) - at - 1, "no place for an error");
-  }
-  return told;
-}
 
 // The healthy run before the line stands for the nth time.
 std::string healthyUpTo(std::string_view line, std::uint64_t occurrence = 1) {
@@ -180,9 +144,7 @@ Fault faultOn(const char* operation, std::optional<std::string> property, std::u
   fault.operation = operation;
   fault.property = std::move(property);
   fault.occurrence = occurrence;
-  fault.action = hasError ? FaultAction::kFail : FaultAction::kNothing;
-  if (hasError) fault.error = FaultError{"BenchErrorDomain", 7, "Broken."};
-  return fault;
+  return failing(fault, hasError);
 }
 
 // Checks the trace with and without an error variable and for several seeds.
@@ -211,7 +173,7 @@ TEST_P(FailingTesselFaultRun, IsToldExactly) {
     std::string told = healthyUpTo(step.line, isSecondSnapshot ? 2 : 1);
     told += step.line + std::string(" -> failed\n") + step.underway + "returned nothing\nerror " + step.error;
     told += std::string("\nafterwards\n") + step.afterwards + step.teardown + "buffers held: " + step.held + '\n';
-    replaceAll(told, "{cause}", hasError ? ", caused by BenchErrorDomain code 7: Broken." : "");
+    replaceAll(told, "{cause}", benchCause(hasError));
     expectTold(told, projectorScenario(), {faultOn(step.operation, step.property, step.occurrence, hasError)});
   }
 }
@@ -226,7 +188,7 @@ TEST(TesselFaultRun, GoesOnBehindAStreamThatTellsNoPort) {
     replaceAll(told, "front get PortType\n", "front get PortType -> failed\n");
     told.replace(told.find("error untouched"), std::string_view("error untouched").size(),
                  std::string("error QZCapturePlugInErrorDomain code 202: Failed to get stream port type!") +
-                     (hasError ? ", caused by BenchErrorDomain code 7: Broken." : ""));
+                     benchCause(hasError));
     expectTold(told, projectorScenario(), {faultOn("CaptureStream.valueForProperty", "PortType", 1, hasError)});
   }
 }
@@ -237,11 +199,7 @@ front-infrared get PortType -> failed
 returned nothing
 error QZCapturePlugInErrorDomain code 202: Failed to find stream!
 afterwards
-device invalidate
-torn down
-error untouched
-buffers held: none
-)",
+)" + toldEnd(),
              projectorScenario(),
              {faultOn("CaptureStream.valueForProperty", "PortType", 1, true),
               faultOn("CaptureStream.valueForProperty", "PortType", 2, true)});
@@ -253,11 +211,7 @@ TEST(TesselFaultRun, FindsNoStreamOnADeviceWithoutAny) {
   expectTold(healthyUpTo("front get PortType") + R"(returned nothing
 error QZCapturePlugInErrorDomain code 202: Failed to find stream!
 afterwards
-device invalidate
-torn down
-error untouched
-buffers held: none
-)",
+)" + toldEnd(),
              scenario, {});
 }
 
@@ -277,7 +231,7 @@ returned nothing
 error QZCapturePlugInErrorDomain code 205: Failed to stop stream!
 afterwards
 )" + kFramesAndTimeoutLater +
-                     "device invalidate\ntorn down\nerror untouched\nbuffers held: front-infrared 4, 5, 6, 7\n";
+                     toldEnd("front-infrared 4, 5, 6, 7");
   expectTold(told, projectorScenario(),
              {faultOn("CaptureStream.valueForProperty", "ErrorCounters", 1, true),
               faultOn("CaptureStream.stop", std::nullopt, 1, true)});
@@ -289,7 +243,7 @@ TEST(TesselFaultRun, TellsWhenTheDeviceIsNotInvalidated) {
     told.replace(told.find("device invalidate"), std::string::npos,
                  std::string("device invalidate -> failed\nnot torn down\nerror QZCapturePlugInErrorDomain code 200: "
                              "Failed to invalidate the capture device.") +
-                     (hasError ? ", caused by BenchErrorDomain code 7: Broken." : "") + "\nbuffers held: none\n");
+                     benchCause(hasError) + "\nbuffers held: none\n");
     expectTold(told, projectorScenario(), {faultOn("CaptureDevice.invalidate", std::nullopt, 1, hasError)});
   }
 }

@@ -22,8 +22,6 @@ namespace quazor {
 namespace {
 
 using testing::ElementsAre;
-using testing::IsEmpty;
-using testing::UnorderedElementsAre;
 
 // All calls to the services, in order.
 using Calls = std::vector<std::string>;
@@ -144,8 +142,8 @@ TEST_F(TesselFaultExperimentSetup, MakesASemaphoreAndThenTwoQueuesAndTouchesNoHa
   ASSERT_EQ(calls->size(), 3U);
   EXPECT_EQ(calls->front(), "semaphore 0");
   EXPECT_THAT(Calls(calls->begin() + 1, calls->end()),
-              UnorderedElementsAre("queue QZTesselFaultExperiment.primaryScalar, user-interactive",
-                                   "queue QZTesselFaultExperiment, background"));
+              testing::UnorderedElementsAre("queue QZTesselFaultExperiment.primaryScalar, user-interactive",
+                                            "queue QZTesselFaultExperiment, background"));
 }
 
 TEST_F(TesselFaultExperimentSetup, UsesTheInstalledPlatformUnlessHandedAnother) {
@@ -193,7 +191,7 @@ TEST_F(TesselFaultExperimentSetup, OwnsWhatItHoldsUntilItGoes) {
   EXPECT_TRUE(weakDevice.expired());
   EXPECT_TRUE(weakStream.expired());
   for (const auto& made : concurrency->made) EXPECT_TRUE(made.expired());
-  EXPECT_THAT(*calls, IsEmpty());
+  EXPECT_THAT(*calls, testing::IsEmpty());
 }
 
 TEST_F(TesselFaultExperimentSetup, DescribesItselfWithTwoRequiredParameters) {
@@ -277,7 +275,7 @@ TEST_F(TesselFaultExperimentSetup, IsSetUpWithoutTouchingAnythingWithOrWithoutAH
   EXPECT_TRUE(experiment->setupWithParameters({{"frameCount", 30}, {"timeout", 2}}, &host, nullptr));
   EXPECT_TRUE(experiment->setupWithParameters({{"frameCount", 30}, {"timeout", 2}}, nullptr, nullptr));
   EXPECT_FALSE(experiment->setupWithParameters({{"frameCount", -30}}, &host, nullptr));
-  EXPECT_THAT(*calls, IsEmpty());
+  EXPECT_THAT(*calls, testing::IsEmpty());
 }
 
 TEST_F(TesselFaultExperimentSetup, HasATeardownForTheHostToFind) {

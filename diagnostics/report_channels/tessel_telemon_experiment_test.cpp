@@ -113,6 +113,16 @@ class TesselTelemonExperiment : public testing::Test {
   std::unique_ptr<QZExperimentResult> run(DiagnosticErrorPtr* error) const {
     return QZTesselTelemonExperiment(platform()).run(error);
   }
+  std::string toldRun() const {
+    const auto result = run(nullptr);
+    return result == nullptr ? "nothing" : told(*result);
+  }
+  // The error of a run that gives nothing, in place of the earlier one.
+  DiagnosticErrorPtr failure() const {
+    DiagnosticErrorPtr error = earlier;
+    EXPECT_EQ(run(&error), nullptr);
+    return error;
+  }
 
   const std::shared_ptr<FacilityState> facility = std::make_shared<FacilityState>();
   const DiagnosticErrorPtr earlier = earlierError();
@@ -159,24 +169,18 @@ TEST_F(TesselTelemonExperiment, TakesTheChannelsOfThePresenceReport) {
       {{"Camera", "K42ISP Events", "another group"}, 4},
       {{"K42ISP", "K42ISP Power", "another subgroup"}, 5},
   };
-  const auto result = run(nullptr);
-  ASSERT_NE(result, nullptr);
-  EXPECT_EQ(told(*result), "both exact = 1 events\nlonger subgroup = 2 events\nlonger group = 3 events\n");
+  EXPECT_EQ(toldRun(), "both exact = 1 events\nlonger subgroup = 2 events\nlonger group = 3 events\n");
 }
 
 TEST_F(TesselTelemonExperiment, LeavesChannelsOutsideTheReportAloneEvenWithoutACount) {
   facility->channels = {{{"Camera", "K42ISP Events", "another group"}, std::nullopt}, event("a", 1)};
-  const auto result = run(nullptr);
-  ASSERT_NE(result, nullptr);
-  EXPECT_EQ(told(*result), "a = 1 events\n");
+  EXPECT_EQ(toldRun(), "a = 1 events\n");
 }
 
 TEST_F(TesselTelemonExperiment, TakesTheLaterOfTwoChannelsWithOneName) {
   facility->channels = {
       event("twice", 1), event("once", 2), {{"K42ISP", "K42ISP Events (front)", "twice"}, 9}, event("last", 3)};
-  const auto result = run(nullptr);
-  ASSERT_NE(result, nullptr);
-  EXPECT_EQ(told(*result), "twice = 9 events\nonce = 2 events\nlast = 3 events\n");
+  EXPECT_EQ(toldRun(), "twice = 9 events\nonce = 2 events\nlast = 3 events\n");
 }
 
 TEST_F(TesselTelemonExperiment, ReadsACountOfAnyKindOfNumberAsADouble) {
@@ -212,8 +216,7 @@ TEST_F(TesselTelemonExperiment, GivesAnEmptyResultWhenNoChannelMatches) {
 TEST_F(TesselTelemonExperiment, FailsWithoutSimpleChannels) {
   facility->hasSet = false;
   facility->setError = facilityError;
-  DiagnosticErrorPtr error = earlier;
-  EXPECT_EQ(run(&error), nullptr);
+  const DiagnosticErrorPtr error = failure();
   EXPECT_EQ(told(error),
             "QZTelemonErrorDomain 100 Could not get simple channels. "
             "{underlying-error: FacilityErrorDomain code -5: The kernel said no.}");
@@ -225,8 +228,7 @@ TEST_F(TesselTelemonExperiment, FailsWithoutASnapshot) {
   facility->channels = {event("a", 1)};
   facility->hasSnapshot = false;
   facility->snapshotError = facilityError;
-  DiagnosticErrorPtr error = earlier;
-  EXPECT_EQ(run(&error), nullptr);
+  const DiagnosticErrorPtr error = failure();
   EXPECT_EQ(told(error),
             "QZTelemonErrorDomain 100 Could not sample the report. "
             "{underlying-error: FacilityErrorDomain code -5: The kernel said no.}");
@@ -236,31 +238,23 @@ TEST_F(TesselTelemonExperiment, FailsWithoutASnapshot) {
 
 TEST_F(TesselTelemonExperiment, FailsAtTheFirstChannelWithoutACount) {
   facility->channels = {event("a", 1), event("Number KT %@ %d", std::nullopt), event("b", std::nullopt)};
-  DiagnosticErrorPtr error = earlier;
-  EXPECT_EQ(run(&error), nullptr);
-  EXPECT_EQ(told(error), "QZTelemonErrorDomain 100 Could not get the count of Number KT %@ %d.");
+  EXPECT_EQ(told(failure()), "QZTelemonErrorDomain 100 Could not get the count of Number KT %@ %d.");
 }
 
 // An error that was stored before the call, or by a successful call, is not the cause.
 TEST_F(TesselTelemonExperiment, GivesNoUnderlyingErrorThatTheFailedCallDidNotGive) {
-  DiagnosticErrorPtr error = earlier;
   facility->hasSet = false;
-  EXPECT_EQ(run(&error), nullptr);
-  EXPECT_EQ(told(error), "QZTelemonErrorDomain 100 Could not get simple channels.");
+  EXPECT_EQ(told(failure()), "QZTelemonErrorDomain 100 Could not get simple channels.");
 
-  error = earlier;
   facility->hasSet = true;
   facility->setError = facilityError;
   facility->hasSnapshot = false;
-  EXPECT_EQ(run(&error), nullptr);
-  EXPECT_EQ(told(error), "QZTelemonErrorDomain 100 Could not sample the report.");
+  EXPECT_EQ(told(failure()), "QZTelemonErrorDomain 100 Could not sample the report.");
 
-  error = earlier;
   facility->hasSnapshot = true;
   facility->snapshotError = facilityError;
   facility->channels = {event("a", std::nullopt)};
-  EXPECT_EQ(run(&error), nullptr);
-  EXPECT_EQ(told(error), "QZTelemonErrorDomain 100 Could not get the count of a.");
+  EXPECT_EQ(told(failure()), "QZTelemonErrorDomain 100 Could not get the count of a.");
 }
 
 TEST_F(TesselTelemonExperiment, SucceedsWhenACallGaveAnErrorAndAResult) {

@@ -3,6 +3,7 @@
 
 #include "backends/simulated/simulated_phone.h"
 #include "diagnostics/report_channels/tessel_telemon_analysis.h"
+#include "tests/support/call_failures.h"
 #include "tests/support/run_transcript.h"
 
 #include <gtest/gtest.h>
@@ -54,21 +55,14 @@ void expectTold(std::string told, const Scenario& scenario, const std::optional<
   for (const ErrorPlace place : {ErrorPlace::kGiven, ErrorPlace::kNone}) {
     RunTranscript transcript;
     SimulatedPhone phone(scenario, PhoneTime::kVirtual, 1);
-    phone.observeCalls([&](const PlatformCall& call) {
-      transcript.addCall(call.operation, call.object, call.detail, call.succeeded);
-    });
+    phone.observeCalls(addingTo(transcript));
     if (failure) {
       Fault fault;
       fault.operation = failure->operation;
       fault.occurrence = 1;
-      fault.action = failure->hasError ? FaultAction::kFail : FaultAction::kNothing;
-      if (failure->hasError) fault.error = FaultError{"BenchErrorDomain", 7, "Broken."};
-      phone.addFault(fault);
+      phone.addFault(failing(fault, failure->hasError));
     }
-    if (place == ErrorPlace::kNone) {
-      const std::size_t at = told.find("\nerror ") + 1;
-      told.replace(at, told.find('\n', at) - at, "no place for an error");
-    }
+    if (place == ErrorPlace::kNone) told = toldWithoutPlace(told);
     QZTesselTelemonExperiment experiment(phone.platform());
     EXPECT_EQ(runAndTell(experiment, place, transcript), told);
     if (failure) {
@@ -77,8 +71,8 @@ void expectTold(std::string told, const Scenario& scenario, const std::optional<
   }
 }
 
-TEST(TesselTelemonRun, SamplesTheChannelsOnce) {
-  expectTold(R"(ReportFacility reportWithOnlySimpleChannels
+// Of the channels of sixChannels() that have all of them a count.
+constexpr const char* kThreeSamples = R"(ReportFacility reportWithOnlySimpleChannels
 ReportChannelSet reportByFilteringChannels 3
 ReportChannelSet snapshot
 returned a result
@@ -86,9 +80,9 @@ error untouched
 Number Fenk NTC = 3 events
 Number ZE FAULT_A = 0 events
 Number KT EN_PIN_STATE = 18446744073709549568 events
-)",
-             scenarioOf(sixChannels()));
-}
+)";
+
+TEST(TesselTelemonRun, SamplesTheChannelsOnce) { expectTold(kThreeSamples, scenarioOf(sixChannels())); }
 
 TEST(TesselTelemonRun, FindsNothingOnAPhoneWithoutSuchChannels) {
   const std::string told = R"(ReportFacility reportWithOnlySimpleChannels
@@ -120,7 +114,7 @@ TEST(TesselTelemonRun, FailsWithoutChannels) {
     expectTold(std::string(R"(ReportFacility reportWithOnlySimpleChannels -> failed
 returned nothing
 error QZTelemonErrorDomain code 100: Could not get simple channels.)") +
-                   (hasError ? ", caused by BenchErrorDomain code 7: Broken.\n" : "\n"),
+                   benchCause(hasError) + "\n",
                scenarioOf(sixChannels()), Failure{"ReportFacility.reportWithOnlySimpleChannels", hasError});
   }
 }
@@ -132,7 +126,7 @@ ReportChannelSet reportByFilteringChannels 3
 ReportChannelSet snapshot -> failed
 returned nothing
 error QZTelemonErrorDomain code 100: Could not sample the report.)") +
-                   (hasError ? ", caused by BenchErrorDomain code 7: Broken.\n" : "\n"),
+                   benchCause(hasError) + "\n",
                scenarioOf(sixChannels()), Failure{"ReportChannelSet.snapshot", hasError});
   }
 }
@@ -156,16 +150,7 @@ error QZTelemonErrorDomain code 100: Could not get the count of )";
 TEST(TesselTelemonRun, LeavesChannelsOutsideTheReportWithoutACountAlone) {
   std::vector<ReportChannelConfig> channels = sixChannels();
   for (std::size_t i = 3; i < channels.size(); ++i) channels[i].count = std::nullopt;
-  expectTold(R"(ReportFacility reportWithOnlySimpleChannels
-ReportChannelSet reportByFilteringChannels 3
-ReportChannelSet snapshot
-returned a result
-error untouched
-Number Fenk NTC = 3 events
-Number ZE FAULT_A = 0 events
-Number KT EN_PIN_STATE = 18446744073709549568 events
-)",
-             scenarioOf(channels));
+  expectTold(kThreeSamples, scenarioOf(channels));
 }
 
 TEST(TesselTelemonRun, IsAnalysedUpToTheFirstNameThatWasNotMeasured) {

@@ -2,6 +2,7 @@
 
 #include "tests/support/hand_made_sensor.h"
 #include "tests/support/run_transcript.h"
+#include "tests/support/thrown_text.h"
 
 #include <gtest/gtest.h>
 
@@ -146,12 +147,8 @@ TEST_F(NimbeImageStream, LeavesADeviceOpenThatRefusesAMode) {
 TEST_F(NimbeImageStream, RaisesWhenThereIsNoHidManager) {
   sensor.hasHidManager = false;
   DiagnosticErrorPtr error = callersOwnError();
-  try {
-    stream->openWithRunLoop(sensor.loop, &error);
-    ADD_FAILURE() << "nothing was raised";
-  } catch (const std::logic_error& raised) {
-    EXPECT_STREQ(raised.what(), "No HID Manager available?!");
-  }
+  EXPECT_EQ(thrownText<std::logic_error>([&] { return stream->openWithRunLoop(sensor.loop, &error); }),
+            "No HID Manager available?!");
   EXPECT_EQ(error, callersOwnError());
   EXPECT_EQ(transcript.text(), "hid createManager -> failed\n");
 }

@@ -3,6 +3,7 @@
 #include <gmock/gmock.h>
 #include <gtest/gtest.h>
 
+#include <iterator>
 #include <sstream>
 
 namespace quazor {
@@ -17,6 +18,12 @@ struct Parsed {
   std::string out;
   std::string err;
 };
+
+// The words of a line, between its blanks.
+std::vector<std::string> wordsOf(const std::string& line) {
+  std::istringstream in(line);
+  return {std::istream_iterator<std::string>(in), {}};
+}
 
 Parsed parse(const std::vector<std::string>& arguments) {
   Parsed parsed;
@@ -60,47 +67,12 @@ TEST(ParseCommandLine, KnowsItsDefaults) {
 }
 
 TEST(ParseCommandLine, ReadsEveryOption) {
-  const std::optional<Options> options = parse({"run",
-                                                "--plugin",
-                                                "a.so",
-                                                "A",
-                                                "--plugin",
-                                                "b.so",
-                                                "--phone",
-                                                "p",
-                                                "--realtime",
-                                                "--seed",
-                                                "18446744073709551615",
-                                                "--set",
-                                                "x=1",
-                                                "B",
-                                                "--set=analysis.y=2",
-                                                "--log-level",
-                                                "debug",
-                                                "--system-log",
-                                                "--format",
-                                                "json",
-                                                "--output",
-                                                "o",
-                                                "--profile",
-                                                "f",
-                                                "--parameters",
-                                                "g",
-                                                "--parameters=h",
-                                                "--record",
-                                                "r",
-                                                "--output",
-                                                "junit:j",
-                                                "--output",
-                                                "csv:c",
-                                                "--deadline",
-                                                "run=5",
-                                                "--deadline",
-                                                "7",
-                                                "--memory",
-                                                "256",
-                                                "--in-process"})
-                                             .options;
+  const std::optional<Options> options =
+      parse(wordsOf("run --plugin a.so A --plugin b.so --phone p --realtime --seed 18446744073709551615 --set x=1 B "
+                    "--set=analysis.y=2 --log-level debug "
+                    "--system-log --format json --output o --profile f --parameters g --parameters=h --record r "
+                    "--output junit:j --output csv:c --deadline run=5 --deadline 7 --memory 256 --in-process"))
+          .options;
   ASSERT_TRUE(options);
   EXPECT_THAT(options->names, ElementsAre("A", "B"));
   EXPECT_THAT(options->plugins, ElementsAre("a.so", "b.so"));
@@ -159,9 +131,8 @@ TEST(ParseCommandLine, TakesAFormatBeforeAFileOnlyWhereThereAreSeveral) {
 
 TEST(ParseCommandLine, ReadsTheOptionsOfExperiments) {
   const std::optional<Options> options =
-      parse({"experiment",   "A",        "B*",  "--plugin", "a.so", "--phone",     "p",
-             "--realtime",   "--seed",   "7",   "--set",    "x=1",  "--log-level", "error",
-             "--system-log", "--format", "csv", "--output", "o",    "--profile",   "f"})
+      parse(wordsOf("experiment A B* --plugin a.so --phone p --realtime --seed 7 "
+                    "--set x=1 --log-level error --system-log --format csv --output o --profile f"))
           .options;
   ASSERT_TRUE(options);
   EXPECT_EQ(options->command, Command::kExperiment);

@@ -48,31 +48,22 @@ class RefusalTest(CommandLineTest):
     def test_an_unknown_command(self):
         self.assert_refused(quazor("rnu", "--all"), 64, "unknown command 'rnu'; did you mean 'run'?")
 
-    def test_an_unknown_option(self):
-        self.refuse(64, "--bogus", arguments=["--bogus"])
-
-    def test_an_unknown_diagnostic(self):
-        self.refuse(64, "there is no diagnostic 'Fake.Oen'; did you mean 'Fake.One'?", names=["Fake.Oen"])
-
-    def test_a_pattern_that_matches_nothing(self):
-        self.refuse(64, "no diagnostic matches 'X*'", names=["Fake.One", "X*"])
-
-    def test_no_diagnostic(self):
-        self.refuse(64, "name the diagnostics to run", names=[])
-
-    def test_an_unknown_parameter(self):
-        self.refuse(64, "has a parameter 'measurd'; did you mean 'measured'?", arguments=["--set", "measurd=1"])
-
-    def test_a_parameter_of_the_other_half(self):
-        self.refuse(64, "no analysis of the selected diagnostics has a parameter 'measured'",
-                    arguments=["--set", "analysis.measured=1"])
-
-    def test_a_missing_required_parameter(self):
-        self.refuse(64, "Fake.One requires the parameter experiment.duration", duration=None)
-
-    def test_a_parameter_that_is_set_twice(self):
-        self.refuse(64, "--set 'duration=1' and --set 'experiment.duration=2' set the same parameter twice",
-                    arguments=["--set", "experiment.duration=2"])
+    def test_names_and_parameters_that_are_none(self):
+        twice = "--set 'duration=1' and --set 'experiment.duration=2' set the same parameter twice"
+        rows = [
+            ("--bogus", {"arguments": ["--bogus"]}),
+            ("there is no diagnostic 'Fake.Oen'; did you mean 'Fake.One'?", {"names": ["Fake.Oen"]}),
+            ("no diagnostic matches 'X*'", {"names": ["Fake.One", "X*"]}),
+            ("name the diagnostics to run", {"names": []}),
+            ("has a parameter 'measurd'; did you mean 'measured'?", {"arguments": ["--set", "measurd=1"]}),
+            ("no analysis of the selected diagnostics has a parameter 'measured'",
+             {"arguments": ["--set", "analysis.measured=1"]}),
+            ("Fake.One requires the parameter experiment.duration", {"duration": None}),
+            (twice, {"arguments": ["--set", "experiment.duration=2"]}),
+        ]
+        for problem, options in rows:
+            with self.subTest(problem):
+                self.refuse(64, problem, **options)
 
     def test_values_that_are_no_finite_numbers(self):
         for text, problem in {"": "a number is missing", "x": "'x' is not a number", "1x": "'1x' is not a number",

@@ -2,17 +2,16 @@
 
 #include "host/error/exit_code.h"
 #include "host/testing/test_directory.h"
+#include "host/testing/test_refusals.h"
+#include "tests/support/thrown_text.h"
 
 #include <gmock/gmock.h>
 #include <gtest/gtest.h>
-
-#include <functional>
 
 namespace quazor {
 namespace {
 
 using testing::ElementsAre;
-using testing::HasSubstr;
 using testing::IsEmpty;
 
 constexpr const char* kError = R"({
@@ -46,25 +45,6 @@ std::string with(std::string text, const std::string& old, const std::string& re
   const std::size_t at = text.find(old);
   EXPECT_NE(at, std::string::npos) << old;
   return text.replace(at, old.size(), replacement);
-}
-
-std::string refusalOf(ExitCode code, const std::function<void()>& call) {
-  try {
-    call();
-  } catch (const CommandError& refusal) {
-    EXPECT_EQ(refusal.code(), code);
-    return refusal.what();
-  }
-  return "accepted";
-}
-
-std::string problemOf(const std::function<void()>& call) {
-  try {
-    call();
-  } catch (const InputError& problem) {
-    return problem.what();
-  }
-  return "accepted";
 }
 
 TEST(ParseExplanations, ReadsErrors) {
@@ -106,12 +86,7 @@ TEST(ParseExplanations, RefusesWhatIsNotExactlyOfTheForm) {
   const std::string plain = errors("Dom", kPlainError);
   const std::string full = errors("Dom", kError);
   const std::string result = names(kResult);
-  struct Row {
-    const char* name;
-    std::string text;
-    const char* problem;
-  };
-  const Row rows[] = {
+  const NamedRefusal rows[] = {
       {"no JSON", "{", "f:1: not valid JSON"},
       {"one key twice", R"({"schema": 1, "schema": 1})", "\"schema\" is duplicated"},
       {"no object", "[]", "f:1: the document: must be an object"},
@@ -153,8 +128,9 @@ TEST(ParseExplanations, RefusesWhatIsNotExactlyOfTheForm) {
        "names[0].from: only a result can have"},
       {"an empty failing", with(result, R"("F")", R"("")"), "names[0].failing: must be a non-empty string"},
   };
-  for (const Row& row : rows) {
-    EXPECT_THAT(problemOf([&] { parseExplanations("f", row.text); }), HasSubstr(row.problem)) << row.name;
+  for (const auto& row : rows) {
+    EXPECT_THAT(thrownText<InputError>([&] { parseExplanations("f", row.text); }), testing::HasSubstr(row.problem))
+        << row.name;
   }
 }
 
@@ -192,9 +168,10 @@ TEST(ReadExplanations, RefusesWhatItCannotUse) {
   for (const Row& row : rows) {
     const TestDirectory directory;
     for (const auto& [name, text] : row.files) directory.write(name, text);
-    EXPECT_THAT(problemOf([&] { readExplanations(directory.path()); }), HasSubstr(row.problem)) << row.name;
+    EXPECT_THAT(thrownText<InputError>([&] { readExplanations(directory.path()); }), testing::HasSubstr(row.problem))
+        << row.name;
   }
-  EXPECT_EQ(problemOf([] { readExplanations("/nowhere"); }),
+  EXPECT_EQ(thrownText<InputError>([] { readExplanations("/nowhere"); }),
             "the explanations in '/nowhere' cannot be used: No such file or directory.");
 }
 
@@ -245,12 +222,7 @@ TEST(FindExplanations, TellsTheNearestDomainWhateverItsEnding) {
 
 TEST(FindExplanations, RefusesWhatHasNoneAndTellsTheNearest) {
   const std::vector<Explanation> all = fewExplanations();
-  struct Row {
-    const char* name;
-    const char* asked;
-    const char* problem;
-  };
-  const Row rows[] = {
+  const NamedRefusal rows[] = {
       {"a code that the domain does not have", "FirstDomain:7",
        "no explanation of code 7 in 'FirstDomain'; the explained codes are -5, 6"},
       {"a domain with a slip", "FristDomain:6",
@@ -272,8 +244,8 @@ TEST(FindExplanations, RefusesWhatHasNoneAndTellsTheNearest) {
       {"a pattern that fits nothing", "X*", "no explanation of 'X*'; 'quazor explain' lists all explanations"},
       {"nothing", "", "no explanation of ''; 'quazor explain' lists all explanations"},
   };
-  for (const Row& row : rows) {
-    EXPECT_EQ(refusalOf(ExitCode::kUsage, [&] { findExplanations(all, row.asked); }), row.problem) << row.name;
+  for (const auto& row : rows) {
+    EXPECT_EQ(refusalOf(ExitCode::kUsage, [&] { findExplanations(all, row.text); }), row.problem) << row.name;
   }
 }
 

@@ -3,6 +3,7 @@
 #include "host/record/record_file.h"
 #include "host/testing/test_directory.h"
 #include "host/testing/test_events.h"
+#include "host/testing/test_refusals.h"
 
 #include <gmock/gmock.h>
 #include <gtest/gtest.h>
@@ -11,8 +12,6 @@
 
 namespace quazor {
 namespace {
-
-using testing::HasSubstr;
 
 class RecordCommandsTest : public testing::Test {
  protected:
@@ -94,13 +93,7 @@ TEST_F(RecordCommandsTest, TellWhenTheStandardOutputCannotBeWritten) {
   const std::filesystem::path whole = record("a", wholeRun());
   out_.setstate(std::ios::badbit);
   for (const auto& action : {std::function<void()>([&] { verify(whole); }), {[&] { diff(whole, whole); }}}) {
-    try {
-      action();
-      ADD_FAILURE() << "it went well";
-    } catch (const CommandError& refusal) {
-      EXPECT_EQ(refusal.code(), ExitCode::kCannotWrite);
-      EXPECT_THAT(refusal.what(), HasSubstr("standard output cannot be written"));
-    }
+    EXPECT_THAT(refusalOf(ExitCode::kCannotWrite, action), testing::HasSubstr("standard output cannot be written"));
   }
 }
 

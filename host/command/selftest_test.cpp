@@ -11,9 +11,6 @@
 namespace quazor {
 namespace {
 
-using testing::ElementsAre;
-using testing::HasSubstr;
-
 ExpectedOutcome passes() { return {"Name", false, {}, "pass", std::nullopt, std::nullopt, {}, std::nullopt}; }
 
 ExpectedOutcome errs() {
@@ -49,7 +46,8 @@ TEST(DifferenceOf, TellsTheFirstThatIsNotAsExpected) {
     ExpectedOutcome outcome = errs();
     outcome.error = error;
     EXPECT_THAT(differenceOf(outcome, recordOf("Name", Verdict::kError)),
-                testing::AllOf(HasSubstr("the error: expected "), HasSubstr("got Domain code -1: it failed")));
+                testing::AllOf(testing::HasSubstr("the error: expected "),
+                               testing::HasSubstr("got Domain code -1: it failed")));
   }
 }
 
@@ -86,9 +84,9 @@ TEST(SelftestVerdicts, TellDetectionsFromMissesAndFalseAlarms) {
   std::vector<SelftestRow> all = rows;
   all.back().runs = 0;
   EXPECT_THAT(verdictsOf(all),
-              ElementsAre(SelftestVerdict::kPassed, SelftestVerdict::kDetected, SelftestVerdict::kMissed,
-                          SelftestVerdict::kFalseAlarm, SelftestVerdict::kDifferent, SelftestVerdict::kInvalid,
-                          SelftestVerdict::kInvalid));
+              testing::ElementsAre(SelftestVerdict::kPassed, SelftestVerdict::kDetected, SelftestVerdict::kMissed,
+                                   SelftestVerdict::kFalseAlarm, SelftestVerdict::kDifferent, SelftestVerdict::kInvalid,
+                                   SelftestVerdict::kInvalid));
   EXPECT_FALSE(allPassed(verdictsOf(all)));
   EXPECT_TRUE(allPassed(verdictsOf({rows[0], rows[1]})));
 }
@@ -97,7 +95,7 @@ TEST(SelftestVerdicts, CountThePhonesFaultsInAllOfItsRowsTogether) {
   const std::vector<SelftestRow> rows = {row("phone", errs(), 3, 0, {3, 0}), row("phone", passes(), 3, 3, {0, 1}),
                                          row("other", errs(), 3, 0, {0})};
   EXPECT_THAT(verdictsOf(rows),
-              ElementsAre(SelftestVerdict::kDetected, SelftestVerdict::kPassed, SelftestVerdict::kInvalid));
+              testing::ElementsAre(SelftestVerdict::kDetected, SelftestVerdict::kPassed, SelftestVerdict::kInvalid));
 }
 
 TEST(Selftest, PrintsEveryRowAndTheMatrix) {

@@ -2,6 +2,7 @@
 
 #include "base/json/json_cursor.h"
 #include "base/text/input_error.h"
+#include "tests/support/thrown_text.h"
 
 #include <gmock/gmock.h>
 #include <gtest/gtest.h>
@@ -18,12 +19,7 @@ std::vector<ExpectedOutcome> outcomesIn(const std::string& expect) {
 ExpectedOutcome outcomeWith(const std::string& entries) { return outcomesIn(R"({"E": {)" + entries + "}}")[0]; }
 
 std::string problemOf(const std::string& json) {
-  try {
-    outcomesIn(json);
-  } catch (const InputError& problem) {
-    return problem.what();
-  }
-  return "none";
+  return thrownText<InputError>([&] { outcomesIn(json); });
 }
 
 TEST(ExpectedOutcomes, AreReadInTheirOrder) {

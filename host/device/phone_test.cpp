@@ -4,6 +4,7 @@
 #include "host/testing/test_directory.h"
 #include "platform/capture_keys.h"
 #include "platform/pixel_buffer.h"
+#include "tests/support/thrown_text.h"
 
 #include <gmock/gmock.h>
 #include <gtest/gtest.h>
@@ -71,12 +72,9 @@ TEST(PhonesOfScenario, RefusesAScenarioThatCannotBeRead) {
   const TestDirectory directory;
   for (const std::filesystem::path& file :
        {directory.path() / "nothing.json", directory.write("text.json", "no JSON"), directory.path()}) {
-    try {
-      phonesOfScenario(file, false, 1);
-      ADD_FAILURE() << file << " was accepted";
-    } catch (const InputError& problem) {
-      EXPECT_THAT(problem.what(), testing::HasSubstr(file.filename().string())) << file;
-    }
+    EXPECT_THAT(thrownText<InputError>([&] { phonesOfScenario(file, false, 1); }),
+                testing::HasSubstr(file.filename().string()))
+        << file;
   }
 }
 
@@ -95,18 +93,10 @@ TEST(ScenarioFiles, AreRefusedWithMalformedExpectations) {
   const TestDirectory directory;
   const std::filesystem::path file = directory.write("one.json", R"({
     "title": "No camera", "cameras": {}, "groups": {}, "expect": {"D": {"verdict": "failed"}}})");
-  const auto problemOf = [](const auto& use) -> std::string {
-    try {
-      use();
-    } catch (const InputError& problem) {
-      return problem.what();
-    }
-    return "none";
-  };
   const std::string due = "the simulated phone cannot be created: " + file.string() +
                           ":2: expect.D.verdict: \"failed\" is not a verdict; did you mean \"fail\"?";
-  EXPECT_EQ(problemOf([&] { phonesOfScenario(file, false, 1); }), due);
-  EXPECT_EQ(problemOf([&] { summaryOfScenario(file); }), due);
+  EXPECT_EQ(thrownText<InputError>([&] { phonesOfScenario(file, false, 1); }), due);
+  EXPECT_EQ(thrownText<InputError>([&] { summaryOfScenario(file); }), due);
 }
 
 TEST(BindingNamed, IsTheFileAfterThePrefix) {
@@ -150,12 +140,8 @@ TEST(PhonesOfBinding, CountsTheFaultsOfTheBinding) {
 
 TEST(PhonesOfBinding, RefusesABindingThatCannotBeRead) {
   const TestDirectory directory;
-  try {
-    phonesOfBinding(directory.write("bad.json", "{\n\"titel\": 1}"));
-    ADD_FAILURE() << "it was accepted";
-  } catch (const InputError& problem) {
-    EXPECT_THAT(problem.what(), testing::HasSubstr("bad.json:2: the document: unknown key \"titel\""));
-  }
+  EXPECT_THAT(thrownText<InputError>([&] { phonesOfBinding(directory.write("bad.json", "{\n\"titel\": 1}")); }),
+              testing::HasSubstr("bad.json:2: the document: unknown key \"titel\""));
 }
 
 TEST(ProbeThisMachine, GivesABindingThatCanBeRead) {

@@ -10,7 +10,6 @@ namespace quazor {
 namespace {
 
 using testing::ElementsAre;
-using testing::IsEmpty;
 
 RunStarted runOf(std::vector<std::string> names) {
   RunStarted run;
@@ -22,7 +21,7 @@ TEST(Unfinished, IsNothingWhenAllHaveRecords) {
   const Unfinished unfinished =
       unfinishedOf(runOf({"A", "B"}), {recordOf("A", Verdict::kPass), recordOf("B", Verdict::kError)}, {});
   EXPECT_EQ(unfinished.interrupted, std::nullopt);
-  EXPECT_THAT(unfinished.neverRun, IsEmpty());
+  EXPECT_THAT(unfinished.neverRun, testing::IsEmpty());
 }
 
 TEST(Unfinished, IsWhatWasInterruptedAndWhatCameBehind) {

@@ -2,6 +2,7 @@
 
 #include "host/error/exit_code.h"
 #include "host/testing/plugins/fake_diagnostic.h"
+#include "host/testing/test_refusals.h"
 #include "platform/platform.h"
 
 #include <gmock/gmock.h>
@@ -31,13 +32,7 @@ class CatalogueTest : public testing::Test {
   }
 
   std::string refusalOf(const std::vector<std::string>& names, Wanted wanted = Wanted::kDiagnostics) const {
-    try {
-      select(names, wanted);
-    } catch (const CommandError& refusal) {
-      EXPECT_EQ(refusal.code(), ExitCode::kUsage);
-      return refusal.what();
-    }
-    return "accepted";
+    return quazor::refusalOf(ExitCode::kUsage, [&] { select(names, wanted); });
   }
 
   QZLab lab_;

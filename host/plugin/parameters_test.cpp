@@ -2,12 +2,13 @@
 
 #include "host/error/exit_code.h"
 #include "host/error/host_error.h"
+#include "host/testing/test_refusals.h"
+#include "tests/support/thrown_text.h"
 
 #include <gmock/gmock.h>
 #include <gtest/gtest.h>
 
 #include <cstdlib>
-#include <functional>
 
 namespace quazor {
 namespace {
@@ -60,16 +61,6 @@ std::vector<ParameterOverride> settings(const std::vector<std::string>& texts) {
   return parsed;
 }
 
-std::string refusalOf(ExitCode code, const std::function<void()>& action) {
-  try {
-    action();
-  } catch (const CommandError& refusal) {
-    EXPECT_EQ(refusal.code(), code);
-    return refusal.what();
-  }
-  return "accepted";
-}
-
 TEST(ParseSetting, TakesThePrefixAsTheHalf) {
   struct Row {
     const char* text;
@@ -95,11 +86,7 @@ TEST(ParseSetting, TakesThePrefixAsTheHalf) {
 }
 
 TEST(ParseSetting, RefusesOtherForms) {
-  struct Row {
-    const char* text;
-    const char* problem;
-  };
-  constexpr Row kRows[] = {
+  constexpr RefusedText kRows[] = {
       {"", "expected [experiment.|analysis.]NAME=VALUE"},
       {"duration", "expected [experiment.|analysis.]NAME=VALUE"},
       {"=3", "the parameter name is missing"},
@@ -110,7 +97,7 @@ TEST(ParseSetting, RefusesOtherForms) {
       {"duration=nan", "'nan' is not a finite number"},
       {"duration=1e999", "'1e999' is outside the range of numbers"},
   };
-  for (const Row& row : kRows) {
+  for (const auto& row : kRows) {
     EXPECT_THAT(refusalOf(ExitCode::kUsage, [&] { parseOverride(row.text); }), HasSubstr(row.problem)) << row.text;
   }
 }

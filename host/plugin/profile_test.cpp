@@ -1,6 +1,7 @@
 #include "host/plugin/profile.h"
 
 #include "base/text/input_error.h"
+#include "tests/support/thrown_text.h"
 
 #include <gmock/gmock.h>
 #include <gtest/gtest.h>
@@ -13,12 +14,7 @@ namespace {
 constexpr const char* kFile = "some.json";
 
 std::string refusalOf(const std::string& text) {
-  try {
-    parseProfile(kFile, text);
-  } catch (const InputError& problem) {
-    return problem.what();
-  }
-  return "accepted";
+  return thrownText<InputError>([&] { parseProfile(kFile, text); }, "accepted");
 }
 
 std::string withDiagnostics(const std::string& diagnostics) {
@@ -47,12 +43,7 @@ TEST(ParseProfile, TakesEntriesWithoutHalvesAndNoEntriesAtAll) {
 }
 
 TEST(ParseProfile, RefusesWhatIsNotExactlyOfTheForm) {
-  struct Row {
-    const char* name;
-    std::string text;
-    const char* problem;
-  };
-  const Row rows[] = {
+  const NamedRefusal rows[] = {
       {"an empty file", "", "1: not valid JSON: "},
       {"no JSON", "duration = 3", "1: not valid JSON: "},
       {"JSON with something behind", withDiagnostics("{}") + "x", "1: not valid JSON: "},
@@ -87,7 +78,7 @@ TEST(ParseProfile, RefusesWhatIsNotExactlyOfTheForm) {
       {"an entry twice", withDiagnostics(R"({"A": {}, "A": {}})"),
        "1: diagnostics: the key \"A\" is duplicated; remove one."},
   };
-  for (const Row& row : rows) {
+  for (const auto& row : rows) {
     EXPECT_THAT(refusalOf(row.text), testing::StartsWith(std::string("some.json:") + row.problem)) << row.name;
   }
 }
@@ -127,14 +118,7 @@ TEST(Profile, FindsTheValueForAnExperiment) {
 }
 
 TEST(ReadProfile, RefusesWhatIsNotAFileOfAProfilesSize) {
-  const auto problemOf = [](const char* file) {
-    try {
-      readProfile(file);
-    } catch (const InputError& problem) {
-      return std::string(problem.what());
-    }
-    return std::string("accepted");
-  };
+  const auto problemOf = [](const char* file) { return thrownText<InputError>([&] { readProfile(file); }); };
   EXPECT_EQ(problemOf("/nowhere/p.json"), "/nowhere/p.json: the file does not exist.");
   EXPECT_EQ(problemOf("/"), "/: this is a directory, not a file.");
   EXPECT_EQ(problemOf("/dev/zero"), "/dev/zero: the file is larger than 16 MiB.");

@@ -2,6 +2,7 @@
 
 #include "base/text/input_error.h"
 #include "host/testing/test_directory.h"
+#include "tests/support/thrown_text.h"
 
 #include <gtest/gtest.h>
 #include <sys/stat.h>
@@ -20,12 +21,7 @@ std::string ownProgram() {
 
 // Empty if the file is valid.
 std::string problemOf(const std::filesystem::path& file) {
-  try {
-    validateSharedObject(file);
-  } catch (const InputError& problem) {
-    return problem.what();
-  }
-  return {};
+  return thrownText<InputError>([&] { validateSharedObject(file); }, "");
 }
 
 TEST(ValidateSharedObject, TakesAWholeFile) { EXPECT_EQ(problemOf("/proc/self/exe"), ""); }

@@ -2,13 +2,13 @@
 
 #include "base/text/input_error.h"
 #include "host/testing/test_values.h"
+#include "tests/support/thrown_text.h"
 
 #include <gmock/gmock.h>
 #include <gtest/gtest.h>
 
 #include <bit>
 #include <cmath>
-#include <functional>
 #include <limits>
 
 namespace quazor {
@@ -21,15 +21,6 @@ using testing::HasSubstr;
 Json throughText(const Json& json) { return Json::parse(json.dump()); }
 
 Value back(const Value& value) { return valueFrom(throughText(losslessValue(value))); }
-
-std::string problemOf(const std::function<void()>& read) {
-  try {
-    read();
-  } catch (const InputError& problem) {
-    return problem.what();
-  }
-  return "accepted";
-}
 
 TEST(LosslessValue, KeepsEveryValue) {
   RandomValues random(1);
@@ -167,11 +158,7 @@ TEST(LosslessDictionary, KeepsTheOrderOfEntries) {
 }
 
 TEST(ValueFrom, RefusesWhatItDoesNotHold) {
-  struct Row {
-    const char* json;
-    const char* problem;
-  };
-  constexpr Row kRows[] = {
+  constexpr RefusedText kRows[] = {
       {"5", "expected a value: an object with one key"},
       {"{}", "expected a value: an object with one key"},
       {R"({"signed":1,"double":1.0})", "expected a value: an object with one key"},
@@ -206,17 +193,13 @@ TEST(ValueFrom, RefusesWhatItDoesNotHold) {
       {R"({"error":{"domain":"D","code":"1","userInfo":[]}})", "expected an integer"},
       {R"({"object":5})", "expected a string"},
   };
-  for (const Row& row : kRows) {
-    EXPECT_THAT(problemOf([&] { valueFrom(Json::parse(row.json)); }), HasSubstr(row.problem)) << row.json;
+  for (const auto& row : kRows) {
+    EXPECT_THAT(thrownText<InputError>([&] { valueFrom(Json::parse(row.text)); }), HasSubstr(row.problem)) << row.text;
   }
 }
 
 TEST(ResultFrom, RefusesWhatIsNoResult) {
-  struct Row {
-    const char* json;
-    const char* problem;
-  };
-  constexpr Row kRows[] = {
+  constexpr RefusedText kRows[] = {
       {"[]", "expected an object"},
       {R"({"measurement":[1.0,"x"]})", "\"name\" is missing"},
       {R"({"name":"n"})", "\"measurement\" is missing"},
@@ -232,8 +215,8 @@ TEST(ResultFrom, RefusesWhatIsNoResult) {
       {R"({"name":"n","measurement":[1.0,"x"],"limit":{"name":"l","lower":null,"upper":[[1.0,"x"],1]}})",
        "expected a boolean"},
   };
-  for (const Row& row : kRows) {
-    EXPECT_THAT(problemOf([&] { resultFrom(Json::parse(row.json)); }), HasSubstr(row.problem)) << row.json;
+  for (const auto& row : kRows) {
+    EXPECT_THAT(thrownText<InputError>([&] { resultFrom(Json::parse(row.text)); }), HasSubstr(row.problem)) << row.text;
   }
 }
 
@@ -242,13 +225,13 @@ TEST(ValueFrom, RefusesWhatIsTooDeepInsteadOfRunningOutOfStack) {
   std::string text;
   for (std::size_t i = 0; i < kLevels; ++i) text += R"({"array":[)";
   for (std::size_t i = 0; i < kLevels; ++i) text += "]}";
-  EXPECT_THAT(problemOf([&] { valueFrom(Json::parse(text)); }), HasSubstr("nested too deeply"));
+  EXPECT_THAT(thrownText<InputError>([&] { valueFrom(Json::parse(text)); }), HasSubstr("nested too deeply"));
 }
 
 TEST(MemberOf, TellsWhatIsMissing) {
   EXPECT_EQ(memberOf(Json{{"a", 5}}, "a"), 5);
-  EXPECT_EQ(problemOf([] { memberOf(Json{{"a", 5}}, "b"); }), "\"b\" is missing");
-  EXPECT_EQ(problemOf([] { memberOf(Json::array(), "b"); }), "expected an object");
+  EXPECT_EQ(thrownText<InputError>([] { memberOf(Json{{"a", 5}}, "b"); }), "\"b\" is missing");
+  EXPECT_EQ(thrownText<InputError>([] { memberOf(Json::array(), "b"); }), "expected an object");
 }
 
 }  // namespace

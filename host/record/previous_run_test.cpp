@@ -13,7 +13,6 @@ namespace quazor {
 namespace {
 
 using testing::ElementsAre;
-using testing::IsEmpty;
 
 TEST(LastRunFile, IsInTheDirectoryForState) {
   struct Row {
@@ -66,7 +65,7 @@ TEST_F(NamesNotPassedTest, HoldWhatDidNotComeToItsEndOrToItsBeginning) {
   EXPECT_THAT(namesAfter(events), ElementsAre("Good", "Bad", "Strange", "Broken"));
 }
 
-TEST_F(NamesNotPassedTest, AreNoneWhenAllPassed) { EXPECT_THAT(namesAfter({runOf({})}), IsEmpty()); }
+TEST_F(NamesNotPassedTest, AreNoneWhenAllPassed) { EXPECT_THAT(namesAfter({runOf({})}), testing::IsEmpty()); }
 
 }  // namespace
 }  // namespace quazor

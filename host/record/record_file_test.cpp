@@ -4,6 +4,7 @@
 #include "host/record/run_event_json.h"
 #include "host/testing/test_directory.h"
 #include "host/testing/test_events.h"
+#include "host/testing/test_refusals.h"
 
 #include <fcntl.h>
 #include <gmock/gmock.h>
@@ -22,19 +23,8 @@ namespace quazor {
 namespace {
 
 namespace fs = std::filesystem;
-using testing::AllOf;
 using testing::HasSubstr;
 using testing::StartsWith;
-
-std::string refusalOf(ExitCode code, const std::function<void()>& action) {
-  try {
-    action();
-  } catch (const CommandError& refusal) {
-    EXPECT_EQ(refusal.code(), code);
-    return refusal.what();
-  }
-  return "accepted";
-}
 
 std::vector<std::string> linesOf(const std::string& text) {
   std::vector<std::string> lines;

@@ -4,6 +4,7 @@
 #include "host/record/lossless_json.h"
 #include "host/testing/test_events.h"
 #include "host/testing/test_values.h"
+#include "tests/support/thrown_text.h"
 
 #include <gmock/gmock.h>
 #include <gtest/gtest.h>
@@ -16,17 +17,11 @@ namespace {
 
 using Json = nlohmann::ordered_json;
 using namespace std::chrono_literals;
-using testing::HasSubstr;
 
 RunEvent back(const RunEvent& event) { return eventFrom(Json::parse(eventJson(event).dump())); }
 
 std::string problemOf(const Json& json) {
-  try {
-    eventFrom(json);
-  } catch (const InputError& problem) {
-    return problem.what();
-  }
-  return "accepted";
+  return thrownText<InputError>([&] { eventFrom(json); }, "accepted");
 }
 
 struct EventRow {
@@ -188,11 +183,7 @@ TEST(EventFrom, RefusesMembersOfAnotherKind) {
 }
 
 TEST(EventFrom, SaysWhatIsWrong) {
-  struct BadRow {
-    const char* json;
-    const char* problem;
-  };
-  constexpr BadRow kRows[] = {
+  constexpr RefusedText kRows[] = {
       {"5", "expected an object"},
       {R"({"event":5})", "\"event\" has the wrong type"},
       {R"({"event":"runbegan"})", "unknown event 'runbegan'"},
@@ -214,7 +205,8 @@ TEST(EventFrom, SaysWhatIsWrong) {
       {R"({"event":"faultsCounted","faults":[{"fired":1}]})", "\"fault\" is missing"},
       {R"({"event":"faultsCounted","faults":[{"fault":{},"fired":-1}]})", "\"fired\" has the wrong type"},
   };
-  for (const BadRow& row : kRows) EXPECT_THAT(problemOf(Json::parse(row.json)), HasSubstr(row.problem)) << row.json;
+  for (const auto& row : kRows)
+    EXPECT_THAT(problemOf(Json::parse(row.text)), testing::HasSubstr(row.problem)) << row.text;
 }
 
 TEST(EventFrom, RefusesAParameterWithAValueFromNowhere) {

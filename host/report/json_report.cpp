@@ -90,44 +90,33 @@ Json declarationJson(const std::string& name, const QZDescription& description,
   return {{"name", name}, {"summary", description.summary()}, {"parameters", std::move(json)}};
 }
 
-}  // namespace
-
-Json recordJson(const DiagnosticRecord& record) {
-  const StageDurations& durations = record.durations;
-  return {{"name", record.name},
-          {"summary", record.summary},
-          {"verdict", nameOf(record.verdict)},
-          {"parameters", parametersJson(record.parameters)},
-          {"measuredResults", resultsJson(record.measuredResults)},
-          {"measurements", measurementsJson(record.measurements)},
-          {"auxiliaryData", dictionaryJson(record.auxiliaryData)},
-          {"error", errorJson(record.error)},
-          {"log", logJson(record.log)},
-          {"faults", faultsJson(record.faults)},
-          {"seed", record.seed},
-          {"durations",
-           {{"setup", durationJson(durations.setup)},
-            {"run", durationJson(durations.run)},
-            {"teardown", durationJson(durations.teardown)},
-            {"analysis", durationJson(durations.analysis)}}}};
+// A record with its results and its analysis, or what an experiment alone has of it.
+Json recordJson(const DiagnosticRecord& record, Json parameters, bool hasAnalysis) {
+  Json json = {{"name", record.name},
+               {"summary", record.summary},
+               {"verdict", nameOf(record.verdict)},
+               {"parameters", std::move(parameters)}};
+  if (hasAnalysis) json["measuredResults"] = resultsJson(record.measuredResults);
+  json["measurements"] = measurementsJson(record.measurements);
+  json["auxiliaryData"] = dictionaryJson(record.auxiliaryData);
+  json["error"] = errorJson(record.error);
+  json["log"] = logJson(record.log);
+  json["faults"] = faultsJson(record.faults);
+  json["seed"] = record.seed;
+  Json& durations = json["durations"];
+  durations["setup"] = durationJson(record.durations.setup);
+  durations["run"] = durationJson(record.durations.run);
+  durations["teardown"] = durationJson(record.durations.teardown);
+  if (hasAnalysis) durations["analysis"] = durationJson(record.durations.analysis);
+  return json;
 }
 
+}  // namespace
+
+Json recordJson(const DiagnosticRecord& record) { return recordJson(record, parametersJson(record.parameters), true); }
+
 Json experimentJson(const DiagnosticRecord& record) {
-  const StageDurations& durations = record.durations;
-  return {{"name", record.name},
-          {"summary", record.summary},
-          {"verdict", nameOf(record.verdict)},
-          {"parameters", dictionaryJson(dictionaryOf(record.parameters.experiment))},
-          {"measurements", measurementsJson(record.measurements)},
-          {"auxiliaryData", dictionaryJson(record.auxiliaryData)},
-          {"error", errorJson(record.error)},
-          {"log", logJson(record.log)},
-          {"faults", faultsJson(record.faults)},
-          {"seed", record.seed},
-          {"durations",
-           {{"setup", durationJson(durations.setup)},
-            {"run", durationJson(durations.run)},
-            {"teardown", durationJson(durations.teardown)}}}};
+  return recordJson(record, dictionaryJson(dictionaryOf(record.parameters.experiment)), false);
 }
 
 Json runDocument(const std::vector<DiagnosticRecord>& records, const std::optional<std::string>& interrupted) {

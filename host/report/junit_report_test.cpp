@@ -15,23 +15,13 @@ using testing::AllOf;
 using testing::HasSubstr;
 using testing::Not;
 
-RunStarted run() {
-  RunStarted run;
-  run.program = "0.1.0";
-  run.contract = 2;
-  run.plugins = {"p.so"};
-  run.phone = "phone.json";
-  run.seed = 5;
-  return run;
-}
-
 DiagnosticRecord record(Verdict verdict) {
   DiagnosticRecord record = recordOf("Diagnostic", verdict);
   record.end = record.begin + 3s;
   return record;
 }
 
-std::string reportOf(const DiagnosticRecord& record) { return junitReport(run(), {record}, std::nullopt); }
+std::string reportOf(const DiagnosticRecord& record) { return junitReport(startedRun(), {record}, std::nullopt); }
 
 TEST(JUnitReport, HasASuiteForEachRecordAndACaseForEachResult) {
   EXPECT_EQ(reportOf(record(Verdict::kPass)),
@@ -107,12 +97,8 @@ TEST(JUnitReport, CallsAResultThatCannotBeJudgedAnError) {
 }
 
 TEST(JUnitReport, HasBothBoundsOfALimit) {
-  QZMeasuredResult result("R", Measurement(2, QZDimensionlessUnit::frames()));
-  QZLimit limit("L");
-  limit.setUpperBound(std::make_shared<const QZBound>(Measurement(2.5, QZDimensionlessUnit::frames()), true));
-  result.setLimit(limit);
   DiagnosticRecord passed = record(Verdict::kPass);
-  passed.measuredResults = {judgeResult(result)};
+  passed.measuredResults = {resultWithMaximum(2, 2.5)};
   EXPECT_THAT(reportOf(passed), AllOf(HasSubstr("<property name=\"upper\" value=\"2.5\"/>\n"
                                                 "        <property name=\"upperOpen\" value=\"true\"/>"),
                                       Not(HasSubstr("name=\"lower"))));
@@ -141,13 +127,13 @@ TEST(JUnitReport, HasACaseForTheResultOfAnExperiment) {
 }
 
 TEST(JUnitReport, AddsTheSuitesUp) {
-  EXPECT_THAT(junitReport(run(), {record(Verdict::kPass), record(Verdict::kFail), record(Verdict::kError)}, {}),
+  EXPECT_THAT(junitReport(startedRun(), {record(Verdict::kPass), record(Verdict::kFail), record(Verdict::kError)}, {}),
               HasSubstr("<testsuites name=\"quazor\" tests=\"7\" failures=\"1\" errors=\"1\" skipped=\"0\" "
                         "time=\"9.000\""));
 }
 
 TEST(JUnitReport, TellsWhatWasInterruptedAndWhatNeverRan) {
-  RunStarted three = run();
+  RunStarted three = startedRun();
   three.names = {"Diagnostic", "Second", "Third"};
   const std::string report = junitReport(three, {record(Verdict::kPass)}, "Second");
   EXPECT_THAT(
@@ -163,9 +149,9 @@ TEST(JUnitReport, TellsWhatWasInterruptedAndWhatNeverRan) {
 }
 
 TEST(JUnitReport, TellsAnInterruptBetweenTwo) {
-  EXPECT_THAT(junitReport(run(), {}, ""), AllOf(HasSubstr("<testsuite name=\"quazor\" tests=\"1\""),
-                                                HasSubstr("interrupted while no diagnostic was running")));
-  EXPECT_THAT(junitReport(run(), {}, std::nullopt), HasSubstr("<testsuites name=\"quazor\" tests=\"0\""));
+  EXPECT_THAT(junitReport(startedRun(), {}, ""), AllOf(HasSubstr("<testsuite name=\"quazor\" tests=\"1\""),
+                                                       HasSubstr("interrupted while no diagnostic was running")));
+  EXPECT_THAT(junitReport(startedRun(), {}, std::nullopt), HasSubstr("<testsuites name=\"quazor\" tests=\"0\""));
 }
 
 }  // namespace

@@ -23,16 +23,6 @@ using testing::IsEmpty;
 
 constexpr Date kStart{};
 
-RunStarted startedRun() {
-  RunStarted run;
-  run.program = "0.1.0";
-  run.contract = 2;
-  run.plugins = {"p.so"};
-  run.phone = "phone.json";
-  run.seed = 5;
-  return run;
-}
-
 // A record whose stages all took place.
 DiagnosticRecord fullRecord(Verdict verdict) {
   DiagnosticRecord record = recordOf("Diagnostic", verdict);

@@ -12,7 +12,6 @@ namespace quazor {
 namespace {
 
 using namespace std::chrono_literals;
-using testing::ElementsAre;
 using testing::IsEmpty;
 
 RecordedRun runWith(std::vector<DiagnosticRecord> records) { return {runOf({}), std::move(records), std::nullopt}; }
@@ -101,7 +100,7 @@ TEST(DifferencesOf, TellWhichDiagnosticsOnlyOneRunHas) {
   const DiagnosticRecord b = recordOf("B", Verdict::kPass);
   const DiagnosticRecord c = recordOf("C", Verdict::kPass);
   EXPECT_THAT(differencesOf(runWith({a, b}), runWith({c, b})),
-              ElementsAre("A is only in the first", "C is only in the second"));
+              testing::ElementsAre("A is only in the first", "C is only in the second"));
 }
 
 }  // namespace

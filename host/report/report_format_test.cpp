@@ -6,6 +6,7 @@
 #include "host/report/json_report.h"
 #include "host/testing/test_events.h"
 #include "host/testing/test_records.h"
+#include "host/testing/test_refusals.h"
 
 #include <gmock/gmock.h>
 #include <gtest/gtest.h>
@@ -16,7 +17,6 @@ namespace {
 
 using testing::EndsWith;
 using testing::HasSubstr;
-using testing::Not;
 using testing::StartsWith;
 
 TEST(Formats, HaveNamesByWhichTheyAreFound) {
@@ -29,15 +29,9 @@ TEST(Formats, HaveNamesByWhichTheyAreFound) {
 }
 
 TEST(ParseOutput, RefusesAWordBeforeAColonThatIsNoFormat) {
-  try {
-    parseOutput("jnuit:report", Format::kText);
-    FAIL() << "it was taken";
-  } catch (const CommandError& refusal) {
-    EXPECT_EQ(refusal.code(), ExitCode::kUsage);
-    EXPECT_STREQ(refusal.what(),
-                 "--output 'jnuit:report': unknown format 'jnuit' (for a file of this name, write "
-                 "'./jnuit:report'); did you mean 'junit'?");
-  }
+  EXPECT_EQ(refusalOf(ExitCode::kUsage, [] { parseOutput("jnuit:report", Format::kText); }),
+            "--output 'jnuit:report': unknown format 'jnuit' (for a file of this name, write "
+            "'./jnuit:report'); did you mean 'junit'?");
 }
 
 TEST(ParseOutput, TakesAFormatBeforeAColon) {
@@ -94,7 +88,7 @@ TEST_F(ReportTextTest, HasADocumentAndATableOfItsOwnForExperiments) {
 
 TEST_F(ReportTextTest, CountsOneRecordOnlyWhenTheRunWasInterrupted) {
   records_.pop_back();
-  EXPECT_THAT(report(Format::kText), Not(HasSubstr("1 diagnostic")));
+  EXPECT_THAT(report(Format::kText), testing::Not(HasSubstr("1 diagnostic")));
   EXPECT_THAT(report(Format::kText, ""), EndsWith("1 diagnostic: 1 passed, 0 failed, 0 ended in an error\n"));
   EXPECT_THAT(report(Format::kText, "B\n"), EndsWith("an error\nInterrupted while B\\x0a was running.\n"));
   EXPECT_EQ(nlohmann::json::parse(report(Format::kJson, "B"))["interrupted"], "B");

@@ -15,7 +15,6 @@ namespace {
 
 using testing::EndsWith;
 using testing::HasSubstr;
-using testing::Not;
 using Json = nlohmann::ordered_json;
 
 class RunReportTest : public testing::Test {
@@ -66,7 +65,7 @@ TEST_F(RunReportTest, SummarizesSeveralDiagnosticsButNotOne) {
   RunReport one({}, console_);
   run(one, {Verdict::kPass});
   EXPECT_EQ(end(one), ExitCode::kAllPassed);
-  EXPECT_THAT(out_.str(), Not(HasSubstr("1 diagnostic")));
+  EXPECT_THAT(out_.str(), testing::Not(HasSubstr("1 diagnostic")));
   RunReport two({}, console_);
   run(two, {Verdict::kPass, Verdict::kFail});
   EXPECT_EQ(end(two), ExitCode::kFailed);

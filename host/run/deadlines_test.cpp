@@ -1,6 +1,8 @@
 #include "host/run/deadlines.h"
 
 #include "host/error/exit_code.h"
+#include "host/testing/test_refusals.h"
+#include "tests/support/thrown_text.h"
 
 #include <gmock/gmock.h>
 #include <gtest/gtest.h>
@@ -11,7 +13,6 @@ namespace quazor {
 namespace {
 
 using namespace std::chrono_literals;
-using testing::HasSubstr;
 
 constexpr auto kYear = 365 * 24h;
 
@@ -51,11 +52,7 @@ TEST(ParseDeadline, TakesSecondsOfOneStageOrOfAll) {
 }
 
 TEST(ParseDeadline, RefusesOtherTexts) {
-  struct Row {
-    const char* text;
-    const char* problem;
-  };
-  constexpr Row kRows[] = {
+  constexpr RefusedText kRows[] = {
       {"", "a number is missing"},
       {"run=", "a number is missing"},
       {"soon", "'soon' is not a number"},
@@ -72,15 +69,10 @@ TEST(ParseDeadline, RefusesOtherTexts) {
       {"Run=5", "unknown stage 'Run'"},
       {"run=5=6", "'5=6' is not a number"},
   };
-  for (const Row& row : kRows) {
-    try {
-      parseDeadline(row.text);
-      ADD_FAILURE() << row.text << " was accepted";
-    } catch (const CommandError& refusal) {
-      EXPECT_EQ(refusal.code(), ExitCode::kUsage) << row.text;
-      EXPECT_THAT(refusal.what(), testing::StartsWith("--deadline '" + std::string(row.text) + "': ")) << row.text;
-      EXPECT_THAT(refusal.what(), HasSubstr(row.problem)) << row.text;
-    }
+  for (const auto& row : kRows) {
+    const std::string refusal = refusalOf(ExitCode::kUsage, [&] { parseDeadline(row.text); });
+    EXPECT_THAT(refusal, testing::StartsWith("--deadline '" + std::string(row.text) + "': ")) << row.text;
+    EXPECT_THAT(refusal, testing::HasSubstr(row.problem)) << row.text;
   }
 }
 

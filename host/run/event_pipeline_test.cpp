@@ -6,6 +6,7 @@
 #include "host/testing/test_directory.h"
 #include "host/testing/test_environment.h"
 #include "host/testing/test_events.h"
+#include "host/testing/test_refusals.h"
 
 #include <gmock/gmock.h>
 #include <gtest/gtest.h>
@@ -18,8 +19,6 @@ namespace quazor {
 namespace {
 
 namespace fs = std::filesystem;
-using testing::AllOf;
-using testing::EndsWith;
 using testing::HasSubstr;
 using testing::IsEmpty;
 
@@ -62,7 +61,8 @@ TEST_F(EventPipelineTest, RecordsAndReportsARun) {
   events.onEvent(RunEnded{std::nullopt, momentAt(99)});
   EXPECT_EQ(events.exitCode(), ExitCode::kFailed);
   EXPECT_THAT(out_.str(),
-              AllOf(HasSubstr("  PASS\n"), EndsWith("2 diagnostics: 1 passed, 1 failed, 0 ended in an error\n")));
+              testing::AllOf(HasSubstr("  PASS\n"),
+                             testing::EndsWith("2 diagnostics: 1 passed, 1 failed, 0 ended in an error\n")));
   EXPECT_THAT(problemsOf(readRecord(record_).events), IsEmpty());
   EXPECT_EQ(runIn(record_).records.size(), 2U);
   EXPECT_EQ(lastRun(), directory_.read("record"));
@@ -117,12 +117,7 @@ TEST_F(EventPipelineTest, RunsWithoutAPlaceForTheLastRun) {
 
 TEST_F(EventPipelineTest, RefusesARecordThatCannotBeBegun) {
   options_.record = directory_.path() / "nowhere" / "record";
-  try {
-    const EventPipeline events(keeping(), console_);
-    ADD_FAILURE() << "it was accepted";
-  } catch (const CommandError& refusal) {
-    EXPECT_EQ(refusal.code(), ExitCode::kCannotWrite);
-  }
+  EXPECT_NE(refusalOf(ExitCode::kCannotWrite, [&] { const EventPipeline events(keeping(), console_); }), "accepted");
   EXPECT_FALSE(fs::exists(previousRunFile()));
 }
 

@@ -7,6 +7,7 @@
 #include "host/testing/test_environment.h"
 #include "host/testing/test_events.h"
 #include "host/testing/test_phone.h"
+#include "host/testing/test_refusals.h"
 #include "host/testing/test_signals.h"
 #include "host/testing/test_values.h"
 
@@ -115,13 +116,11 @@ TEST_F(ScanTest, TellsWhichPluginsADiagnosticNeeds) {
 }
 
 TEST_F(ScanTest, ThrowsTheRefusalsOfTheLoader) {
-  try {
-    scan({"working", "empty"});
-    ADD_FAILURE() << "it was accepted";
-  } catch (const CommandError& refusal) {
-    EXPECT_EQ(refusal.code(), ExitCode::kCannotRead);
-    EXPECT_EQ(std::string(refusal.what()), "the plug-in '" + plugin("empty").string() + "' registers nothing");
-  }
+  EXPECT_EQ(refusalOf(ExitCode::kCannotRead,
+                      [&] {
+                        scan({"working", "empty"});
+                      }),
+            "the plug-in '" + plugin("empty").string() + "' registers nothing");
 }
 
 TEST_F(ScanTest, LeavesOutAPluginThatEndsItsProcessWhileItIsLoaded) {

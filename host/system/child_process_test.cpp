@@ -23,7 +23,6 @@ namespace quazor {
 namespace {
 
 using namespace std::chrono_literals;
-using testing::HasSubstr;
 
 // Waits up to a minute for the child to end.
 std::string endOf(ChildProcess& child) {
@@ -80,7 +79,7 @@ TEST_F(ChildProcessTest, EndsByWhatItsWorkThrows) {
   ChildProcess child(
       signals_, [](int) { throw std::runtime_error("it threw"); }, std::nullopt);
   EXPECT_EQ(endOf(child), "signal 6 (SIGABRT)");
-  EXPECT_THAT(readAll(child.outputDescriptor()), HasSubstr("it threw"));
+  EXPECT_THAT(readAll(child.outputDescriptor()), testing::HasSubstr("it threw"));
 }
 
 TEST_F(ChildProcessTest, DoesNotWaitForItsEnd) {

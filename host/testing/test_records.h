@@ -2,6 +2,7 @@
 #pragma once
 
 #include "host/model/diagnostic_record.h"
+#include "host/model/run_event.h"
 
 #include <chrono>
 #include <memory>
@@ -17,6 +18,15 @@ inline QZMeasuredResult resultWithMinimum(double value, double minimum) {
   limit.setLowerBound(std::make_shared<const QZBound>(Measurement(minimum, QZDimensionlessUnit::frames()), false));
   result.setLimit(std::move(limit));
   return result;
+}
+
+// A judged result whose limit is an open upper bound alone.
+inline JudgedResult resultWithMaximum(double value, double maximum) {
+  QZMeasuredResult result("R", Measurement(value, QZDimensionlessUnit::frames()));
+  QZLimit limit("L");
+  limit.setUpperBound(std::make_shared<const QZBound>(Measurement(maximum, QZDimensionlessUnit::frames()), true));
+  result.setLimit(std::move(limit));
+  return judgeResult(result);
 }
 
 inline std::vector<JudgedResult> judgeResults(const std::vector<QZMeasuredResult>& results) {
@@ -48,6 +58,27 @@ inline DiagnosticRecord recordOf(const std::string& name, Verdict verdict) {
     record.error = errorWithMessage("Domain", -1, "it failed", cause);
   }
   return record;
+}
+
+// How recordOf("Name", Verdict::kError) reads when it holds nothing but its error.
+inline constexpr const char* kTextOfErrorAlone =
+    "Name\n"
+    "  Its summary.\n"
+    "\n"
+    "  ERROR\n"
+    "    Domain code -1: it failed\n"
+    "    caused by Deep code 2: the cause\n"
+    "\n";
+
+// A run on a simulated phone.
+inline RunStarted startedRun() {
+  RunStarted run;
+  run.program = "0.1.0";
+  run.contract = 2;
+  run.plugins = {"p.so"};
+  run.phone = "phone.json";
+  run.seed = 5;
+  return run;
 }
 
 }  // namespace quazor

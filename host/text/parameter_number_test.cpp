@@ -1,6 +1,7 @@
 #include "host/text/parameter_number.h"
 
 #include "base/text/input_error.h"
+#include "tests/support/thrown_text.h"
 
 #include <gmock/gmock.h>
 #include <gtest/gtest.h>
@@ -43,11 +44,7 @@ TEST(ParseNumber, KeepsTheKindOfTheNumber) {
 }
 
 TEST(ParseNumber, RefusesWhatIsNoFiniteNumber) {
-  struct Row {
-    const char* text;
-    const char* problem;
-  };
-  constexpr Row kRows[] = {
+  constexpr RefusedText kRows[] = {
       {"", "a number is missing"},
       {" ", "' ' is not a number"},
       {"abc", "'abc' is not a number"},
@@ -73,7 +70,7 @@ TEST(ParseNumber, RefusesWhatIsNoFiniteNumber) {
       {"1e-999", "'1e-999' is outside the range of numbers"},
       {"1e999x", "'1e999x' is not a number"},
   };
-  for (const Row& row : kRows) {
+  for (const auto& row : kRows) {
     EXPECT_THAT([&] { static_cast<void>(parseNumber(row.text)); }, testing::ThrowsMessage<InputError>(row.problem));
   }
 }

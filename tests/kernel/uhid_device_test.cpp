@@ -21,8 +21,6 @@ namespace quazor {
 namespace {
 
 using namespace std::chrono_literals;
-using ::testing::ElementsAre;
-using ::testing::SizeIs;
 
 // A sensor on connected sockets; the test plays the kernel.
 class UhidDeviceTest : public ::testing::Test {
@@ -169,9 +167,9 @@ TEST_F(UhidDeviceTest, FeatureReportsAreAnsweredRefusedOrIgnored) {
   EXPECT_EQ(set(0xAD, 1, UHID_OUTPUT_REPORT), EIO);
   EXPECT_EQ(set(0xAD, 1, UHID_FEATURE_REPORT, 1), EIO);
   EXPECT_EQ(sensor_->due(), std::nullopt);
-  ASSERT_THAT(sensor_->features(), SizeIs(5));
+  ASSERT_THAT(sensor_->features(), testing::SizeIs(5));
   EXPECT_EQ(sensor_->features()[0].id, 0xAB);
-  EXPECT_THAT(sensor_->features()[0].data, ElementsAre(0xAB, 1));
+  EXPECT_THAT(sensor_->features()[0].data, testing::ElementsAre(0xAB, 1));
 }
 
 TEST_F(UhidDeviceTest, ReadsOfFeatureReportsAreRefusedAndOtherEventsPassedOver) {

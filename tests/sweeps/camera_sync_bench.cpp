@@ -3,6 +3,7 @@
 #include "backends/simulated/simulated_phone.h"
 #include "diagnostics/camera_sync/camera_sync_experiment.h"
 #include "platform/capture_keys.h"
+#include "tests/support/call_failures.h"
 
 #include <gtest/gtest.h>
 
@@ -36,20 +37,6 @@ std::size_t findLine(std::string_view text, std::string_view line, std::uint64_t
   }
   ADD_FAILURE() << "the healthy run has no line " << line;
   return 0;
-}
-
-void replaceAll(std::string& text, std::string_view from, std::string_view to) {
-  for (std::size_t at = text.find(from); at != std::string::npos; at = text.find(from, at + to.size())) {
-    text.replace(at, from.size(), to);
-  }
-}
-
-// As `told` reads for a caller without a place for an error.
-std::string toldWithoutPlace(std::string told) {
-  const std::size_t at = told.find("\nerror ", told.find("returned "));
-  EXPECT_NE(at, std::string::npos) << told;
-  const std::size_t end = told.find('\n', at + 1);
-  return told.replace(at + 1, end - at - 1, "no place for an error");
 }
 
 std::string expectedText(const FaultRow& row, std::string_view healthyRun) {
@@ -109,8 +96,7 @@ BenchRun runOnBench(Side side, const Scenario& scenario, const std::optional<Fau
 
   RunTranscript transcript;
   SimulatedPhone phone(scenario, PhoneTime::kVirtual, 1);
-  phone.observeCalls(
-      [&](const PlatformCall& call) { transcript.addCall(call.operation, call.object, call.detail, call.succeeded); });
+  phone.observeCalls(addingTo(transcript));
   if (fault) phone.addFault(*fault);
   QZCameraSyncExperiment experiment(isBack ? backPorts : frontPorts, isBack ? Array{16, 14, 9} : Array{1, 0}, 30,
                                     phone.platform());
@@ -131,12 +117,11 @@ void expectToldWithFault(const FaultRow& row, Side side, const Scenario& scenari
     fault.object = row.call.object;
     fault.property = row.call.property;
     fault.occurrence = row.call.occurrence;
-    fault.action = hasError ? FaultAction::kFail : FaultAction::kNothing;
-    if (hasError) fault.error = FaultError{"BenchErrorDomain", 7, "Broken."};
+    fault = failing(fault, hasError);
     std::string told = expected;
     replaceAll(told, "{error}", hasError ? "BenchErrorDomain code 7: Broken." : "(null)");
-    replaceAll(told, "{cause}", hasError ? ", caused by BenchErrorDomain code 7: Broken." : "");
-    SCOPED_TRACE(std::string(row.name) + (hasError ? ", with an error of its own" : ", without an error of its own"));
+    replaceAll(told, "{cause}", benchCause(hasError));
+    SCOPED_TRACE(row.name + (hasError ? ", with an error of its own" : ", without an error of its own"));
 
     const BenchRun withPlace = runOnBench(side, scenario, fault, ErrorPlace::kGiven);
     EXPECT_EQ(withPlace.told, told);

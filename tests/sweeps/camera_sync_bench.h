@@ -34,10 +34,12 @@ struct BenchRun {
 BenchRun runOnBench(Side side, const Scenario& scenario, const std::optional<Fault>& fault, ErrorPlace place);
 
 // What runOnBench() tells of healthy runs, in full.
-extern const char* const kHealthyBackRun;
-extern const char* const kHealthyFrontRun;
+extern const std::string kHealthyBackRun;
+extern const std::string kHealthyFrontRun;
 // The back run on the phone without the master configuration.
-extern const char* const kHealthyBackRunWithoutMasterConfiguration;
+extern const std::string kHealthyBackRunWithoutMasterConfiguration;
+// The part of it in which the slaves are configured.
+extern const char* const kSlavesConfiguredByThemselves;
 
 // A call of the run: the nth call of the operation, on that object and for that property; nothing matches any.
 struct CallOfRun {
@@ -53,7 +55,7 @@ inline constexpr const char* kSetStream = "CaptureStream.setValue";
 
 // A failing call and its consequences.
 struct FaultRow {
-  const char* name;
+  std::string name;
   CallOfRun call;
   // The trace from the call on; before it the run equals the healthy one. {error} stands for the text of the call's
   // error, {cause} for the part of an error chain that it causes.

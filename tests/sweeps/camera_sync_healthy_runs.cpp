@@ -3,8 +3,11 @@
 
 namespace quazor {
 
-const char* const kHealthyBackRun =
-    R"(service create plug-in
+namespace {
+
+// The runs of the back cameras differ in how the slaves are configured, and in nothing else.
+std::string backRun(const char* slaveConfiguration) {
+  constexpr const char* kBefore = R"(service create plug-in
 plug-in get device
 device get groups
 back-cameras get streams
@@ -22,9 +25,8 @@ back-wide set MultipleOutputSupportEnabled = 1
 back-tele set MultipleOutputSupportEnabled = 1
 back-super-wide set MultipleOutputSupportEnabled = 1
 back-cameras get MasterConfigurationSupportedKeys
-log default: Device supports SlaveConfigurationByPortType
-back-cameras set MasterConfiguration = {SlaveConfigurationByPortType = {BackFacingTelephotoCamera = {StreamingOutputsEnabled = 1; FrameSkippingEnabled = 0; TimeMachineEnabled = 0; MasterToSlaveFrameRateRatio = 1}; BackFacingSuperWideCamera = {StreamingOutputsEnabled = 1; FrameSkippingEnabled = 0; TimeMachineEnabled = 0; MasterToSlaveFrameRateRatio = 1}}}
-back-wide set FormatIndex = 16
+)";
+  constexpr const char* kAfterwards = R"(back-wide set FormatIndex = 16
 back-wide set MinimumFrameRate = 30
 back-wide set MaximumFrameRate = 30
 back-tele set FormatIndex = 14
@@ -73,27 +75,17 @@ BackSuperWide.FrameOffset = 2 frames
 BackSuperWide.Frames = 58 frames
 ErrorCounters = {BackWide = {I2CErrorCount = 11}; BackTele = {I2CErrorCount = 22}; BackSuperWide = {I2CErrorCount = 33}}
 )";
+  return std::string(kBefore) + slaveConfiguration + kAfterwards;
+}
 
-const char* const kHealthyBackRunWithoutMasterConfiguration =
-    R"(service create plug-in
-plug-in get device
-device get groups
-back-cameras get streams
-back-wide get PortType
-back-wide get PortType
-back-tele get PortType
-back-wide get PortType
-back-tele get PortType
-back-super-wide get PortType
-device request control (back-wide, back-tele, back-super-wide)
-back-cameras set ActiveStreams = (stream back-wide (BackFacingCamera), stream back-tele (BackFacingTelephotoCamera), stream back-super-wide (BackFacingSuperWideCamera))
-back-cameras get SynchronizationMaster
-device set MultiCamConfiguration = {ActiveSynchronizedStreamsGroups = (group back-cameras)}
-back-wide set MultipleOutputSupportEnabled = 1
-back-tele set MultipleOutputSupportEnabled = 1
-back-super-wide set MultipleOutputSupportEnabled = 1
-back-cameras get MasterConfigurationSupportedKeys
-log default: Device does not support SlaveConfigurationByPortType, using SynchronizedStreamsSlaveConfiguration instead.
+}  // namespace
+
+const std::string kHealthyBackRun = backRun(R"(log default: Device supports SlaveConfigurationByPortType
+back-cameras set MasterConfiguration = {SlaveConfigurationByPortType = {BackFacingTelephotoCamera = {StreamingOutputsEnabled = 1; FrameSkippingEnabled = 0; TimeMachineEnabled = 0; MasterToSlaveFrameRateRatio = 1}; BackFacingSuperWideCamera = {StreamingOutputsEnabled = 1; FrameSkippingEnabled = 0; TimeMachineEnabled = 0; MasterToSlaveFrameRateRatio = 1}}}
+)");
+
+const char* const kSlavesConfiguredByThemselves =
+    R"(log default: Device does not support SlaveConfigurationByPortType, using SynchronizedStreamsSlaveConfiguration instead.
 back-wide get PortType
 back-tele get PortType
 back-tele set SynchronizedStreamsSlaveConfiguration = {StreamingOutputsEnabled = 1; FrameSkippingEnabled = 0; TimeMachineEnabled = 0; MasterToSlaveFrameRateRatio = 1}
@@ -102,58 +94,13 @@ back-wide get PortType
 back-tele get PortType
 back-super-wide get PortType
 back-super-wide set SynchronizedStreamsSlaveConfiguration = {StreamingOutputsEnabled = 1; FrameSkippingEnabled = 0; TimeMachineEnabled = 0; MasterToSlaveFrameRateRatio = 1}
-back-wide set FormatIndex = 16
-back-wide set MinimumFrameRate = 30
-back-wide set MaximumFrameRate = 30
-back-tele set FormatIndex = 14
-back-tele set MinimumFrameRate = 30
-back-tele set MaximumFrameRate = 30
-back-super-wide set FormatIndex = 9
-back-super-wide set MinimumFrameRate = 30
-back-super-wide set MaximumFrameRate = 30
-back-wide start
-back-tele start
-back-super-wide start
-clock sleep 2
-device get MulticamSessionStatus
-back-wide get ErrorCounters
-log default: BackFacingCamera <-- sync master
-  Offset: 0
-  Frames: 60
-  Total: 60
-  ErrorCounters: {I2CErrorCount = 11}
-
-back-tele get ErrorCounters
-log default: BackFacingTelephotoCamera
-  Offset: 1
-  Frames: 59
-  Total: 60
-  ErrorCounters: {I2CErrorCount = 22}
-
-back-super-wide get ErrorCounters
-log default: BackFacingSuperWideCamera
-  Offset: 2
-  Frames: 58
-  Total: 60
-  ErrorCounters: {I2CErrorCount = 33}
-
-back-super-wide stop
-back-tele stop
-back-wide stop
-device relinquish control (back-wide, back-tele, back-super-wide)
-returned a result
-error untouched
-BackWide.FrameOffset = 0 frames
-BackWide.Frames = 60 frames
-BackTele.FrameOffset = 1 frames
-BackTele.Frames = 59 frames
-BackSuperWide.FrameOffset = 2 frames
-BackSuperWide.Frames = 58 frames
-ErrorCounters = {BackWide = {I2CErrorCount = 11}; BackTele = {I2CErrorCount = 22}; BackSuperWide = {I2CErrorCount = 33}}
 )";
 
+const std::string kHealthyBackRunWithoutMasterConfiguration = backRun(kSlavesConfiguredByThemselves);
+;
+
 // The group of the back cameras is looked through first: it has streams enough, and none of the ports.
-const char* const kHealthyFrontRun =
+const std::string kHealthyFrontRun =
     R"(service create plug-in
 plug-in get device
 device get groups

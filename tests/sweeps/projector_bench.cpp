@@ -2,6 +2,7 @@
 
 #include "backends/faults/operations.h"
 #include "backends/simulated/simulated_phone.h"
+#include "contract/message_format.h"
 #include "diagnostics/projector_fault/tessel_fault_experiment.h"
 #include "platform/capture_keys.h"
 
@@ -96,13 +97,41 @@ FrameMetadata unlitFrameForSafety() {
   return metadata;
 }
 
+std::string toldMeasurements(int frames, int faultA, int faultC) {
+  return formatMessage(R"(FrameCount = %d frames
+I2C = 1 errors
+MIPI = 2 errors
+LPDP = 3 errors
+UART = 4 errors
+SIF = 5 errors
+Projector = 6 errors
+Number ZE FAULT_A = %d events
+Number ZE FAULT_C = %d events
+Number Fenk NTC = 0 events
+Number Dwna NTC = 0 events
+)",
+                       frames, faultA, faultC);
+}
+
+std::string toldResult(int frames, int faultA, int faultC) {
+  return R"(front-infrared get ErrorCounters
+front-infrared stop
+ReportChannelSet snapshot
+ReportSnapshot snapshotWithBaseline
+returned a result
+error untouched
+)" + toldMeasurements(frames, faultA, faultC);
+}
+
+std::string toldEnd(const std::string& held) { return kTornDown + ("buffers held: " + held + '\n'); }
+
 ProjectorRun runProjector(const Scenario& scenario, const ProjectorRequest& request, const std::vector<Fault>& faults,
                           ErrorPlace place) {
   RunTranscript transcript;
   ProjectorRun run;
   SimulatedPhone phone(scenario, PhoneTime::kVirtual, request.seed);
-  phone.observeCalls([&](const PlatformCall& call) {
-    transcript.addCall(call.operation, call.object, call.detail, call.succeeded);
+  phone.observeCalls([&, addCall = addingTo(transcript)](const PlatformCall& call) {
+    addCall(call);
     if (call.operation != report_operation::kFilter) ++run.calls;
   });
   for (const Fault& fault : faults) phone.addFault(fault);

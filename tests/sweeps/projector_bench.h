@@ -5,9 +5,9 @@
 #include "backends/simulated/scenario/scenario.h"
 #include "contract/value.h"
 #include "tests/support/run_transcript.h"
+#include "tests/sweeps/call_sweep.h"
 
 #include <chrono>
-#include <cstddef>
 #include <cstdint>
 #include <string>
 #include <vector>
@@ -34,16 +34,21 @@ struct ProjectorRequest {
   std::uint64_t seed = 1;
 };
 
-struct ProjectorRun {
-  // The run as runAndTell() tells it; then "afterwards" and what happens on the phone until `watched`; then
-  //   torn down | not torn down
-  //   error untouched | error emptied | error (as errorChain()) | no place for an error
-  //   buffers held: front-infrared 3, 4 | buffers held: none
-  // Frames count from 1 here too.
-  std::string told;
-  std::size_t calls = 0;             // that can fail, the teardown's included
-  std::vector<std::uint64_t> fired;  // how often each of the faults happened
-};
+// The run as runAndTell() tells it; then "afterwards" and what happens on the phone until `watched`; then
+//   torn down | not torn down
+//   error untouched | error emptied | error (as errorChain()) | no place for an error
+//   buffers held: front-infrared 3, 4 | buffers held: none
+// Frames count from 1 here too, and the teardown's calls among those that can fail.
+using ProjectorRun = SweptRun;
+
+// What is told of the result of a run on projectorScenario() that got these frames and whose two counters that count
+// came to these events: its measurements, and before them how it is got.
+std::string toldMeasurements(int frames, int faultA, int faultC);
+std::string toldResult(int frames, int faultA, int faultC);
+
+// What is told of a teardown that goes well, without and with the line of the buffers.
+inline constexpr const char* kTornDown = "device invalidate\ntorn down\nerror untouched\n";
+std::string toldEnd(const std::string& held = "none");
 
 // Sets up a new experiment, runs it on a new phone in virtual time, lets time pass, and tears it down. The run and the
 // teardown get an error variable, which contains callersOwnError() before each, or none.

@@ -3,12 +3,12 @@
 #include "backends/simulated/scenario/scenario.h"
 #include "tests/support/run_transcript.h"
 #include "tests/support/shipped_scenario.h"
+#include "tests/sweeps/call_sweep.h"
 #include "tests/sweeps/projector_bench.h"
 #include "tests/sweeps/projector_oracle.h"
 
 #include <gtest/gtest.h>
 
-#include <array>
 #include <iostream>
 #include <optional>
 #include <ostream>
@@ -94,33 +94,7 @@ projector_oracle::Phone phoneOf(const Sweep& sweep, Scenario scenario) {
   return phone;
 }
 
-// A call that is made to fail: the nth of the run.
-struct Failure {
-  std::size_t call;
-  bool hasError;
-};
-
-std::string messageOf(std::size_t call) { return "Call " + std::to_string(call) + " was made to fail."; }
-
-Fault faultOf(const Failure& failure) {
-  Fault fault;
-  fault.operation = "*";
-  fault.occurrence = failure.call;
-  fault.action = failure.hasError ? FaultAction::kFail : FaultAction::kNothing;
-  if (failure.hasError) fault.error = FaultError{"SweepErrorDomain", -3, messageOf(failure.call)};
-  return fault;
-}
-
-projector_oracle::Failures failuresOf(const std::vector<Failure>& failures) {
-  projector_oracle::Failures predicted;
-  for (const Failure& failure : failures) {
-    predicted[failure.call] =
-        failure.hasError ? std::optional("SweepErrorDomain code -3: " + messageOf(failure.call)) : std::nullopt;
-  }
-  return predicted;
-}
-
-class ProjectorSweep : public testing::TestWithParam<Sweep> {
+class ProjectorSweep : public CallSweep, public testing::WithParamInterface<Sweep> {
  protected:
   void SetUp() override {
     scenario_ = scenarioOf(GetParam());
@@ -129,7 +103,7 @@ class ProjectorSweep : public testing::TestWithParam<Sweep> {
   void TearDown() override { std::cout << "[sweep] " << GetParam().name << ": " << cases_ << " cases\n"; }
 
   // Runs with the failures, under a seed of its own, and compares with the oracle.
-  ProjectorRun check(const std::vector<Failure>& failures, ErrorPlace place) {
+  SweptRun check(const std::vector<CallFailure>& failures, ErrorPlace place) override {
     const projector_oracle::Request& request = GetParam().request;
     ProjectorRequest made;
     made.frameCount = request.frameCount;
@@ -137,8 +111,8 @@ class ProjectorSweep : public testing::TestWithParam<Sweep> {
     made.watched = std::chrono::milliseconds(static_cast<std::int64_t>(request.watched * 1000 + 0.5));
     made.seed = ++cases_;
     std::vector<Fault> faults;
-    for (const Failure& failure : failures) faults.push_back(faultOf(failure));
-    ProjectorRun run = runProjector(scenario_, made, faults, place);
+    for (const CallFailure& failure : failures) faults.push_back(faultOf(failure));
+    SweptRun run = runProjector(scenario_, made, faults, place);
     const projector_oracle::Prediction prediction =
         projector_oracle::predictFaultRun(phone_, request, failuresOf(failures), place == ErrorPlace::kGiven);
     EXPECT_EQ(run.told, prediction.told);
@@ -146,54 +120,19 @@ class ProjectorSweep : public testing::TestWithParam<Sweep> {
     return run;
   }
 
-  // Lets each call behind the first failure fail too, in the run that the first failure leads to, and one call more,
-  // which is never reached.
-  void checkWithEveryLaterFailure(const Failure& first, bool hasError, ErrorPlace place) {
-    const ProjectorRun alone = check({first}, place);
-    for (std::size_t second = first.call + 1; second <= alone.calls + 1; ++second) {
-      const bool isReached = second <= alone.calls;
-      const ProjectorRun run = check({first, {second, hasError}}, place);
-      EXPECT_EQ(run.fired, (std::vector<std::uint64_t>{1, isReached ? 1U : 0U}));
-      if (!isReached) {
-        EXPECT_EQ(run.told, alone.told);
-      }
-      ASSERT_FALSE(HasFailure()) << "calls " << first.call << " and " << second;
-    }
-  }
-
   Scenario scenario_;
   projector_oracle::Phone phone_;
-  std::uint64_t cases_ = 0;
 };
-
-constexpr std::array kPlaces{ErrorPlace::kGiven, ErrorPlace::kNone};
-constexpr std::array kHasError{true, false};
 
 TEST_P(ProjectorSweep, ARunWithoutFailuresIsAsPredicted) {
   for (const ErrorPlace place : kPlaces) {
-    const ProjectorRun run = check({}, place);
+    const SweptRun run = check({}, place);
     const bool isGood = !GetParam().secondFrame;
     EXPECT_EQ(run.told.find("returned a result\n") != std::string::npos, isGood) << run.told;
   }
 }
 
-TEST_P(ProjectorSweep, EveryCallMayFail) {
-  const ProjectorRun healthy = check({}, ErrorPlace::kGiven);
-  ASSERT_GT(healthy.calls, 20U);
-  for (std::size_t call = 1; call <= healthy.calls; ++call) {
-    for (const bool hasError : kHasError) {
-      for (const ErrorPlace place : kPlaces) {
-        const ProjectorRun run = check({{call, hasError}}, place);
-        ASSERT_EQ(run.fired, std::vector<std::uint64_t>{1}) << "call " << call;
-        ASSERT_FALSE(HasFailure()) << "call " << call << (hasError ? " with" : " without") << " an error";
-      }
-    }
-  }
-  // One more than there are does nothing.
-  const ProjectorRun beyond = check({{healthy.calls + 1, true}}, ErrorPlace::kGiven);
-  EXPECT_EQ(beyond.fired, std::vector<std::uint64_t>{0});
-  EXPECT_EQ(beyond.told, healthy.told);
-}
+TEST_P(ProjectorSweep, EveryCallMayFail) { checkEveryFailure(); }
 
 // Without an error variable both failures have errors, none of which may be stored.
 TEST_P(ProjectorSweep, EveryTwoCallsMayFail) {

@@ -18,7 +18,7 @@ using Time = std::int64_t;
 constexpr Time kSecond = 1'000'000'000;
 constexpr Time kNever = std::numeric_limits<Time>::max();
 constexpr std::string_view kFailed = " -> failed";
-constexpr std::string_view kNeverReturned = "never returned: The simulated phone waits forever: ";
+constexpr std::string_view kNeverReturned = "never returned: The simulated phone waits for ever: ";
 
 // Thrown if a run breaks a rule, after which it cannot be parsed further.
 struct Broken {
@@ -117,7 +117,7 @@ class Reader {
       returned_ = false;
       readOutcome(errorIsUntouched_);
       const bool isEndless = known_.timeout > static_cast<std::uint64_t>(kNever / kSecond);
-      if (!end.why.ends_with(" hangs") && !isEndless) throw Broken{"the run waits forever, and nothing hangs"};
+      if (!end.why.ends_with(" hangs") && !isEndless) throw Broken{"the run waits for ever, and nothing hangs"};
     }
     expect("ended");
     if (next_ < lines_.size()) readAfterwards();

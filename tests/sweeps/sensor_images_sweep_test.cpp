@@ -90,7 +90,7 @@ Known knownOf(const Scenario& phone, const Request& request, const std::string& 
   known.errors = {"SensorErrorDomain code -536870174: The sensor does not answer.",
                   "SimulatedHidErrorDomain code 4: display-sensor has been removed.",
                   "SimulatedHidErrorDomain code 5: display-sensor has no feature report 0xAC.",
-                  "SimulatedHidErrorDomain code 6: Feature report 0xAB of display-sensor does not accept the value 1."};
+                  "SimulatedHidErrorDomain code 6: Feature report 0xAB of display-sensor does not take the value 1."};
   if (phone.hidDevices.empty()) return known;
   known.firstFrameID = phone.hidDevices.front().images.firstFrameID;
   known.noImages = reportsWithoutImage(phone.hidDevices.front());

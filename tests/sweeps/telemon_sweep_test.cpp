@@ -5,6 +5,7 @@
 #include "diagnostics/report_channels/tessel_telemon_experiment.h"
 #include "tests/support/run_transcript.h"
 #include "tests/support/shipped_scenario.h"
+#include "tests/sweeps/call_sweep.h"
 #include "tests/sweeps/projector_bench.h"
 #include "tests/sweeps/projector_oracle.h"
 
@@ -19,39 +20,24 @@
 namespace quazor {
 namespace {
 
-// Which call fails, from 1, or 0 for none; with an error of its own or without one.
-struct Failure {
-  std::size_t call = 0;
-  bool hasError = true;
-};
-
 class TelemonSweep : public testing::Test {
  protected:
   void TearDown() override { std::cout << "[sweep] " << cases_ << " cases\n"; }
 
-  void check(const Scenario& scenario, const Failure& failure, ErrorPlace place) {
+  // Without a failure when the call is 0.
+  void check(const Scenario& scenario, const CallFailure& failure, ErrorPlace place) {
     ++cases_;
     RunTranscript transcript;
     SimulatedPhone phone(scenario, PhoneTime::kVirtual, cases_);
-    phone.observeCalls([&](const PlatformCall& call) {
-      transcript.addCall(call.operation, call.object, call.detail, call.succeeded);
-    });
-    projector_oracle::Failures failures;
-    if (failure.call != 0) {
-      Fault fault;
-      fault.operation = "*";
-      fault.occurrence = failure.call;
-      fault.action = failure.hasError ? FaultAction::kFail : FaultAction::kNothing;
-      if (failure.hasError) fault.error = FaultError{"SweepErrorDomain", -3, "Made to fail."};
-      phone.addFault(fault);
-      failures[failure.call] =
-          failure.hasError ? std::optional<std::string>("SweepErrorDomain code -3: Made to fail.") : std::nullopt;
-    }
+    if (failure.call != 0) phone.addFault(faultOf(failure));
+    phone.observeCalls(addingTo(transcript));
     std::vector<projector_oracle::PhoneChannel> channels;
     for (const ReportChannelConfig& channel : scenario.reports) {
       channels.push_back({channel.group, channel.subGroup, channel.name, channel.count});
     }
-    const auto prediction = projector_oracle::predictPresenceRun(channels, failures, place == ErrorPlace::kGiven);
+    const auto prediction = projector_oracle::predictPresenceRun(
+        channels, failure.call == 0 ? projector_oracle::Failures() : failuresOf({failure}),
+        place == ErrorPlace::kGiven);
     QZTesselTelemonExperiment experiment(phone.platform());
     EXPECT_EQ(runAndTell(experiment, place, transcript), prediction.told);
     if (failure.call != 0) {

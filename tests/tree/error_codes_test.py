@@ -1,22 +1,17 @@
 #!/usr/bin/env python3
 """Tests tests/tree/error_codes.py with small trees, one per form of returning an error."""
 
-import pathlib
-import tempfile
 import unittest
 
 import error_codes
+from made_up_tree import made_up_tree
 
 DOMAIN = 'inline constexpr std::string_view LampErrorDomain = "LampErrorDomain";\n'
 
 
 def in_tree(files, call):
-    with tempfile.TemporaryDirectory() as directory:
-        for name, text in files.items():
-            path = pathlib.Path(directory, name)
-            path.parent.mkdir(parents=True, exist_ok=True)
-            path.write_text(text)
-        return call(pathlib.Path(directory))
+    with made_up_tree(files) as root:
+        return call(root)
 
 
 def errors_in(body, **more):

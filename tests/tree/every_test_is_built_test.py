@@ -1,20 +1,15 @@
 #!/usr/bin/env python3
 """Tests tests/tree/every_test_is_built.py with small trees."""
 
-import pathlib
-import tempfile
 import unittest
 
 import every_test_is_built
+from made_up_tree import made_up_tree
 
 
 def left_out_of(files):
-    with tempfile.TemporaryDirectory() as directory:
-        for name, text in files.items():
-            path = pathlib.Path(directory, name)
-            path.parent.mkdir(parents=True, exist_ok=True)
-            path.write_text(text)
-        return every_test_is_built.tests_left_out(pathlib.Path(directory).resolve())
+    with made_up_tree(files) as root:
+        return every_test_is_built.tests_left_out(root.resolve())
 
 
 class EveryTestIsBuiltTest(unittest.TestCase):

@@ -140,10 +140,7 @@ def main():
     root = pathlib.Path(sys.argv[1] if len(sys.argv) > 1 else ".").resolve()
     folders = folders_with_sources(root)
     found = violations(root, include_directions.ALLOWED, DESCRIBED)
-    for line in found:
-        print(line)
-    print(f"{len(folders)} folders with C++, {len(found)} violations")
-    return 1 if found or not folders else 0
+    return include_directions.report(found, f"{len(folders)} folders with C++") or not folders
 
 
 if __name__ == "__main__":

@@ -2,10 +2,10 @@
 """Tests tests/tree/folders.py with small trees, one per rule, and checks that the folders it names exist."""
 
 import pathlib
-import tempfile
 import unittest
 
 import folders
+from made_up_tree import made_up_tree
 
 ROWS = {"contract": [], "base/text": [], "base/json": ["contract", "base/text"], "host/run": ["contract", "base/json"]}
 README = """# contract: a title
@@ -21,12 +21,7 @@ TREE = {"contract/value.h": "", "contract/CMakeLists.txt": "", "contract/README.
 
 def found_in(changes, described=()):
     """The violations in a tree that is well but for `changes`: texts by path, None for a file that is not there."""
-    with tempfile.TemporaryDirectory() as directory:
-        root = pathlib.Path(directory)
-        for name, text in {**TREE, **changes}.items():
-            if text is not None:
-                (root / name).parent.mkdir(parents=True, exist_ok=True)
-                (root / name).write_text(text)
+    with made_up_tree({name: text for name, text in {**TREE, **changes}.items() if text is not None}) as root:
         return folders.violations(root, ROWS, described)
 
 

@@ -227,17 +227,21 @@ def violations(root):
     return found
 
 
+def report(found, count):
+    """Prints the violations and how many there are among how many files; the exit code."""
+    for line in found:
+        print(line)
+    print(f"{count}, {len(found)} violations")
+    return 1 if found else 0
+
+
 def main():
     root = pathlib.Path(sys.argv[1] if len(sys.argv) > 1 else ".").resolve()
     count = len(list(sources(root)))
     if count == 0:
         print(f"no C++ under {root}")
         return 1
-    found = violations(root)
-    for line in found:
-        print(line)
-    print(f"{count} files, {len(found)} violations")
-    return 1 if found else 0
+    return report(violations(root), f"{count} files")
 
 
 if __name__ == "__main__":

@@ -1,13 +1,10 @@
 #!/usr/bin/env python3
 """Tests tests/tree/include_directions.py with small trees, one per rule."""
 
-import pathlib
-import subprocess
-import sys
-import tempfile
 import unittest
 
 import include_directions
+from made_up_tree import made_up_tree, run_over
 
 TREE = [
     "contract/value.h", "platform/clock.h", "diagnostics/camera_sync/names.h", "diagnostics/report_channels/names.h", "diagnostics/projector_fault/fault.h",
@@ -20,13 +17,7 @@ TREE = [
 
 def found_in(path, line, extra=()):
     """The violations in a tree whose one interesting file, `path`, holds `line`."""
-    with tempfile.TemporaryDirectory() as directory:
-        root = pathlib.Path(directory)
-        for name in [*TREE, *extra]:
-            (root / name).parent.mkdir(parents=True, exist_ok=True)
-            (root / name).write_text("#pragma once\n")
-        (root / path).parent.mkdir(parents=True, exist_ok=True)
-        (root / path).write_text(f"// A file.\n{line}\n")
+    with made_up_tree({**dict.fromkeys([*TREE, *extra], "#pragma once\n"), path: f"// A file.\n{line}\n"}) as root:
         return include_directions.violations(root)
 
 
@@ -133,26 +124,17 @@ class RefusedTest(unittest.TestCase):
 
 
 class CommandTest(unittest.TestCase):
-    def run_over(self, files):
-        with tempfile.TemporaryDirectory() as directory:
-            for name, text in files.items():
-                path = pathlib.Path(directory, name)
-                path.parent.mkdir(parents=True, exist_ok=True)
-                path.write_text(text)
-            program = pathlib.Path(include_directions.__file__)
-            return subprocess.run([sys.executable, program, directory], capture_output=True, text=True, check=False)
-
     def test_a_clean_tree_exits_with_0(self):
-        result = self.run_over({"contract/a.h": "#include <string>\n"})
+        result = run_over(include_directions, {"contract/a.h": "#include <string>\n"})
         self.assertEqual((result.returncode, result.stdout), (0, "1 files, 0 violations\n"))
 
     def test_a_violation_exits_with_1(self):
-        result = self.run_over({"contract/a.h": "#include <unistd.h>\n"})
+        result = run_over(include_directions, {"contract/a.h": "#include <unistd.h>\n"})
         self.assertEqual(result.returncode, 1)
         self.assertIn("contract/a.h:1: <unistd.h>", result.stdout)
 
     def test_a_tree_without_sources_is_no_success(self):
-        self.assertEqual(self.run_over({"README.md": ""}).returncode, 1)
+        self.assertEqual(run_over(include_directions, {"README.md": ""}).returncode, 1)
 
 
 if __name__ == "__main__":

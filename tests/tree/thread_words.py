@@ -22,6 +22,8 @@ import pathlib
 import re
 import sys
 
+import include_directions
+
 OTHER_FOLDERS = ("tests/", "benchmarks/", "examples/", "host/testing/", "build")
 OTHER_NAMES = ("_for_tests.h", "_conformance.h", "_fixture.h")
 
@@ -139,10 +141,7 @@ def main():
         return 1
     found = [f"{name}:{line}: {what} does not say which threads may use it (// Thread: ...)"
              for name in names for line, what in silent_classes((root / name).read_text(encoding="utf-8"))]
-    for line in found:
-        print(line)
-    print(f"{len(names)} headers, {len(found)} violations")
-    return 1 if found else 0
+    return include_directions.report(found, f"{len(names)} headers")
 
 
 if __name__ == "__main__":

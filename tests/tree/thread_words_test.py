@@ -1,14 +1,11 @@
 #!/usr/bin/env python3
 """Tests tests/tree/thread_words.py with small headers and small trees."""
 
-import pathlib
 import re
-import subprocess
-import sys
-import tempfile
 import unittest
 
 import thread_words
+from made_up_tree import run_over
 
 
 def silent_in(text):
@@ -87,13 +84,7 @@ class WhatNeedsNoWordTest(unittest.TestCase):
 
 class TreeTest(unittest.TestCase):
     def run_on(self, names):
-        with tempfile.TemporaryDirectory() as directory:
-            for name in names:
-                path = pathlib.Path(directory, name)
-                path.parent.mkdir(parents=True, exist_ok=True)
-                path.write_text("class Lamp {\n};\n")
-            program = pathlib.Path(thread_words.__file__)
-            return subprocess.run([sys.executable, program, directory], capture_output=True, text=True, check=False)
+        return run_over(thread_words, dict.fromkeys(names, "class Lamp {\n};\n"))
 
     def test_product_headers_are_checked(self):
         run = self.run_on(["host/run/lamp.h", "contract/lamp.h"])
@@ -108,11 +99,8 @@ class TreeTest(unittest.TestCase):
         self.assertEqual((run.returncode, run.stdout.splitlines()[0][:10]), (1, "no headers"))
 
     def test_a_tree_that_says_all_passes(self):
-        with tempfile.TemporaryDirectory() as directory:
-            pathlib.Path(directory, "lamp.h").write_text("// Thread: any.\nclass Lamp {\n};\n")
-            program = pathlib.Path(thread_words.__file__)
-            run = subprocess.run([sys.executable, program, directory], capture_output=True, text=True, check=False)
-            self.assertEqual((run.returncode, run.stdout), (0, "1 headers, 0 violations\n"))
+        run = run_over(thread_words, {"lamp.h": "// Thread: any.\nclass Lamp {\n};\n"})
+        self.assertEqual((run.returncode, run.stdout), (0, "1 headers, 0 violations\n"))
 
 
 if __name__ == "__main__":

@@ -1,6 +1,7 @@
 #include "backends/linux/binding/binding.h"
 
 #include "base/text/input_error.h"
+#include "tests/support/thrown_text.h"
 
 #include <gmock/gmock.h>
 #include <gtest/gtest.h>
@@ -21,7 +22,6 @@ namespace {
 namespace fs = std::filesystem;
 using ::testing::ElementsAre;
 using ::testing::Field;
-using ::testing::IsEmpty;
 
 class BindingTest : public ::testing::Test {
  protected:
@@ -36,13 +36,7 @@ class BindingTest : public ::testing::Test {
   }
   // The error message, with "F" for the file; "nothing" if the text is valid.
   std::string problemOf(std::string_view text) {
-    std::string problem;
-    try {
-      read(text);
-      return "nothing";
-    } catch (const InputError& error) {
-      problem = error.what();
-    }
+    std::string problem = thrownText<InputError>([&] { read(text); });
     const std::size_t at = problem.find(file_.string());
     return at == std::string::npos ? problem : problem.replace(at, file_.string().size(), "F");
   }
@@ -179,7 +173,7 @@ TEST_F(BindingTest, ReadsAllThereIsToSay) {
 
 TEST_F(BindingTest, ATitleIsEnough) {
   const Binding binding = read(R"({"title": "t"})");
-  EXPECT_THAT(binding.cameras, IsEmpty());
+  EXPECT_THAT(binding.cameras, testing::IsEmpty());
   EXPECT_FALSE(binding.display);
 }
 

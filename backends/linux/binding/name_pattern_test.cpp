@@ -1,6 +1,7 @@
 #include "backends/linux/binding/name_pattern.h"
 
 #include "base/text/input_error.h"
+#include "tests/support/thrown_text.h"
 
 #include <gmock/gmock.h>
 #include <gtest/gtest.h>
@@ -73,10 +74,7 @@ TEST(NamePattern, KnowsItsPlaceholders) {
 }
 
 TEST(NamePattern, RefusesWhatIsNone) {
-  const struct {
-    const char* pattern;
-    const char* problem;
-  } kRows[] = {
+  const RefusedText kRows[] = {
       {"{", "contains an unmatched brace."},
       {"a{b", "contains an unmatched brace."},
       {"a}b", "contains an unmatched brace."},
@@ -85,9 +83,9 @@ TEST(NamePattern, RefusesWhatIsNone) {
       {"{name}-{name}", "contains the placeholder \"{name}\" twice; remove one."},
   };
   for (const auto& row : kRows) {
-    EXPECT_THAT([&] { static_cast<void>(NamePattern::parse(row.pattern)); },
+    EXPECT_THAT([&] { static_cast<void>(NamePattern::parse(row.text)); },
                 testing::ThrowsMessage<InputError>(row.problem))
-        << row.pattern;
+        << row.text;
   }
 }
 

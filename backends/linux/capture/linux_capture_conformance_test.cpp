@@ -3,6 +3,9 @@
 #include "backends/linux/capture/linux_capture_for_tests.h"
 #include "backends/linux/system/linux_error.h"
 
+#include <map>
+#include <string>
+
 namespace quazor {
 namespace {
 
@@ -22,30 +25,18 @@ class LinuxCaptureUnderTest {
   std::shared_ptr<CaptureService> service() { return fake_.capture; }
   std::shared_ptr<CaptureService> serviceWithoutDevice() { return makeLinuxCapture(Binding()); }
   std::string refusal(CaptureRefusal reason) {
-    const auto code = static_cast<std::int64_t>(codeOf(reason));
-    return std::string(LinuxErrorDomain) + " " + std::to_string(code);
+    static const std::map<CaptureRefusal, int> kCodes{
+        {CaptureRefusal::kNoDevice, 2},           {CaptureRefusal::kUnknownProperty, 10},
+        {CaptureRefusal::kReadOnlyProperty, 10},  {CaptureRefusal::kWrongType, 6},
+        {CaptureRefusal::kOutOfRange, 6},         {CaptureRefusal::kForeignObject, 6},
+        {CaptureRefusal::kUnsupported, 5},        {CaptureRefusal::kControlledByAnother, 8},
+        {CaptureRefusal::kNotControlled, 7},      {CaptureRefusal::kWrongState, 7},
+        {CaptureRefusal::kUnreadableProperty, 7}, {CaptureRefusal::kInvalidated, 7}};
+    return std::string(LinuxErrorDomain) + " " + std::to_string(kCodes.at(reason));
   }
   void pass(std::chrono::milliseconds time) { fake_.kernel->passTime(time); }
 
  private:
-  static LinuxErrorCode codeOf(CaptureRefusal reason) {
-    switch (reason) {
-      case CaptureRefusal::kNoDevice: return LinuxErrorCode::kNoDevice;
-      case CaptureRefusal::kUnknownProperty:
-      case CaptureRefusal::kReadOnlyProperty: return LinuxErrorCode::kNoSuchProperty;
-      case CaptureRefusal::kWrongType:
-      case CaptureRefusal::kOutOfRange:
-      case CaptureRefusal::kForeignObject: return LinuxErrorCode::kBadValue;
-      case CaptureRefusal::kUnsupported: return LinuxErrorCode::kNotSupported;
-      case CaptureRefusal::kControlledByAnother: return LinuxErrorCode::kBusy;
-      case CaptureRefusal::kNotControlled:
-      case CaptureRefusal::kWrongState:
-      case CaptureRefusal::kUnreadableProperty:
-      case CaptureRefusal::kInvalidated: return LinuxErrorCode::kWrongState;
-    }
-    return {};
-  }
-
   FakeCameras fake_;
 };
 

@@ -67,7 +67,7 @@ class FakeCameras {
       if (i == 3) {
         node.controls = {{kStrobe, "Strobe", 0, 2, 2}, {kPower, "Power", 0, 100, 5}};
         node.metadata = {1, 2, 3, 4};
-        node.metadataNode = kernel->add(13, fakeMetadata("fake:3"));
+        node.metadataNode = metadataNode = kernel->add(13, fakeMetadata("fake:3"));
       }
       nodes.push_back(kernel->add(i, std::move(node)));
     }
@@ -110,6 +110,22 @@ class FakeCameras {
     ASSERT_EQ(set(*streams[index], capture_key::VideoOutputsEnabled, output(true)), "done");
     ASSERT_EQ(set(*streams[index], capture_key::VideoOutputHandlers, output(handlers)), "done");
   }
+  // The usual camera, started, with or without a handler.
+  void begin(std::size_t index) const {
+    prepare(index);
+    ASSERT_EQ(start(index), "done");
+  }
+  void begin(std::size_t index, PixelBufferHandler::Function function) const {
+    prepare(index);
+    handle(index, std::move(function));
+    ASSERT_EQ(start(index), "done");
+  }
+  // The text with the paths of the infrared camera's nodes for NODE and META.
+  std::string withPaths(std::string text) const {
+    if (const auto at = text.find("NODE"); at != std::string::npos) text.replace(at, 4, nodes[3]);
+    if (const auto at = text.find("META"); at != std::string::npos) text.replace(at, 4, metadataNode);
+    return text;
+  }
   static Dictionary output(Value value) { return Dictionary{{text(capture_key::PrimaryScaler), std::move(value)}}; }
   static Dictionary light(int mode, int pattern = 0, int current = 0) {
     return Dictionary{{text(capture_key::Mode), mode},
@@ -135,6 +151,7 @@ class FakeCameras {
   std::shared_ptr<FakeV4l2Api> kernel = std::make_shared<FakeV4l2Api>();
   Binding binding;
   std::vector<std::string> nodes;  // the cameras' paths
+  std::string metadataNode;        // the infrared camera's
   std::shared_ptr<LinuxCapture> capture;
   std::shared_ptr<CaptureDevice> device;
   CaptureStreams streams;
@@ -169,6 +186,13 @@ class SeenFrames {
   std::mutex mutex_;
   std::condition_variable changed_;
   std::vector<SeenFrame> frames_;
+};
+
+// A test of one such machine.
+class FakeCamerasTest : public testing::Test {
+ protected:
+  SeenFrames seen;  // outlives those that call it
+  FakeCameras fake;
 };
 
 }  // namespace quazor

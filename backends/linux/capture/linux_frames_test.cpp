@@ -10,16 +10,13 @@ namespace quazor {
 namespace {
 
 using Fake = FakeCameras;
+using LinuxFramesTest = FakeCamerasTest;
 using namespace std::chrono_literals;
 
 constexpr std::size_t kInfrared = 3;
 
-TEST(LinuxFramesTest, AFrameCarriesItsTimeStampAndItsMetadata) {
-  Fake fake;
-  SeenFrames seen;
-  fake.prepare(kInfrared);
-  fake.handle(kInfrared, seen.handler());
-  ASSERT_EQ(fake.start(kInfrared), "done");
+TEST_F(LinuxFramesTest, AFrameCarriesItsTimeStampAndItsMetadata) {
+  fake.begin(kInfrared, seen.handler());
   fake.kernel->passTime(100ms);
   const std::vector<SeenFrame> frames = seen.wait(4);
   ASSERT_EQ(frames.size(), 4U);
@@ -31,49 +28,36 @@ TEST(LinuxFramesTest, AFrameCarriesItsTimeStampAndItsMetadata) {
   EXPECT_EQ(FramePool::shared().held(), 0U);
 }
 
-TEST(LinuxFramesTest, StampsInTheFutureAreTakenAsTheyAre) {
-  Fake fake;
+TEST_F(LinuxFramesTest, StampsInTheFutureAreTakenAsTheyAre) {
   fake.kernel->with(fake.nodes[kInfrared], [](FakeNode& node) { return node.stampedAhead = 30ms; });
-  SeenFrames seen;
-  fake.prepare(kInfrared);
-  fake.handle(kInfrared, seen.handler());
-  ASSERT_EQ(fake.start(kInfrared), "done");
+  fake.begin(kInfrared, seen.handler());
   fake.kernel->passTime(10ms);
   EXPECT_EQ(seen.wait(1).at(0).time, 1'000'030'000'000);
   EXPECT_EQ(fake.counter(kInfrared, "MetadataErrorCount"), 0);
 }
 
-TEST(LinuxFramesTest, ADriverWithoutMonotonicStampsGetsTheMomentOfDelivery) {
-  Fake fake;
+TEST_F(LinuxFramesTest, ADriverWithoutMonotonicStampsGetsTheMomentOfDelivery) {
   fake.kernel->with(fake.nodes[0], [](FakeNode& node) {
     node.timestampFlags = V4L2_BUF_FLAG_TIMESTAMP_UNKNOWN;
     return node.stampedAhead = 500s;
   });
-  SeenFrames seen;
-  fake.prepare(0);
-  fake.handle(0, seen.handler());
-  ASSERT_EQ(fake.start(0), "done");
+  fake.begin(0, seen.handler());
   fake.kernel->passTime(0ms);
   fake.kernel->produce(fake.nodes[0]);
   EXPECT_EQ(seen.wait(1).at(0).time, 1'000'000'000'000);
 }
 
-TEST(LinuxFramesTest, TheMetadataNodeStreamsBeforeTheCameraSoThatFrameZeroHasItsPair) {
-  Fake fake;
-  SeenFrames seen;
+TEST_F(LinuxFramesTest, TheMetadataNodeStreamsBeforeTheCameraSoThatFrameZeroHasItsPair) {
   fake.prepare(kInfrared);
   fake.handle(kInfrared, seen.handler());
   fake.kernel->failNext(fake.nodes[kInfrared], VIDIOC_STREAMON, EINVAL);
   EXPECT_EQ(fake.start(kInfrared),
             "1 VIDIOC_STREAMON on " + fake.nodes[kInfrared] + " failed: Invalid argument (EINVAL)");
   const std::vector<std::string> want{"STREAMON", "STREAMOFF"};
-  const std::string metadata = (fake.kernel->roots().dev / "video13").string();
-  EXPECT_EQ(fake.kernel->with(metadata, [](auto& node) { return node.history; }), want);
+  EXPECT_EQ(fake.kernel->with(fake.metadataNode, [](auto& node) { return node.history; }), want);
 }
 
-TEST(LinuxFramesTest, AFrameWithoutItsPairComesLateAndWithoutTheFields) {
-  Fake fake;
-  SeenFrames seen;
+TEST_F(LinuxFramesTest, AFrameWithoutItsPairComesLateAndWithoutTheFields) {
   fake.prepare(kInfrared);
   fake.handle(kInfrared, seen.handler());
   fake.kernel->with(fake.nodes[kInfrared], [](FakeNode& node) {
@@ -89,18 +73,15 @@ TEST(LinuxFramesTest, AFrameWithoutItsPairComesLateAndWithoutTheFields) {
   EXPECT_EQ(fake.counter(kInfrared, "MetadataErrorCount"), 1);
 }
 
-TEST(LinuxFramesTest, AMetadataNodeThatFailsLeavesTheCameraStreaming) {
+TEST(LinuxFramesOwnMachineTest, AMetadataNodeThatFailsLeavesTheCameraStreaming) {
   for (const bool atQueue : {false, true}) {
     Fake fake;
     SeenFrames seen;
-    fake.prepare(kInfrared);
-    fake.handle(kInfrared, seen.handler());
-    ASSERT_EQ(fake.start(kInfrared), "done");
-    const std::string metadata = (fake.kernel->roots().dev / "video13").string();
+    fake.begin(kInfrared, seen.handler());
     if (atQueue) {
-      fake.kernel->failNext(metadata, VIDIOC_QBUF, EINVAL);
+      fake.kernel->failNext(fake.metadataNode, VIDIOC_QBUF, EINVAL);
     } else {
-      fake.kernel->breakStream(metadata);
+      fake.kernel->breakStream(fake.metadataNode);
     }
     fake.kernel->passTime(330ms);
     EXPECT_EQ(seen.wait(10).size(), 10U);
@@ -110,15 +91,12 @@ TEST(LinuxFramesTest, AMetadataNodeThatFailsLeavesTheCameraStreaming) {
   }
 }
 
-TEST(LinuxFramesTest, ABufferThatIsKeptTakesNothingFromTheDriver) {
-  Fake fake;
+TEST_F(LinuxFramesTest, ABufferThatIsKeptTakesNothingFromTheDriver) {
   std::vector<PixelBuffer*> kept;
-  fake.prepare(0);
-  fake.handle(0, [&](PixelBuffer& buffer, MediaTime) {
+  fake.begin(0, [&](PixelBuffer& buffer, MediaTime) {
     buffer.retain();
     kept.push_back(&buffer);
   });
-  ASSERT_EQ(fake.start(0), "done");
   fake.kernel->passTime(990ms);
   EXPECT_EQ(fake.counter(0, "SequenceGapCount"), 0);
   EXPECT_EQ(fake.stop(0), "done");
@@ -131,36 +109,25 @@ TEST(LinuxFramesTest, ABufferThatIsKeptTakesNothingFromTheDriver) {
   EXPECT_EQ(FramePool::shared().held(), 0U);
 }
 
-TEST(LinuxFramesTest, FewerBuffersThanAskedForAreEnough) {
-  Fake fake;
+TEST_F(LinuxFramesTest, FewerBuffersThanAskedForAreEnough) {
   fake.kernel->with(fake.nodes[0], [](FakeNode& node) { return node.mostBuffers = 1; });
-  fake.prepare(0);
-  ASSERT_EQ(fake.start(0), "done");
+  fake.begin(0);
   fake.kernel->passTime(990ms);
   EXPECT_EQ(fake.counter(0, "SequenceGapCount"), 0);
   EXPECT_EQ(fake.stop(0), "done");
 }
 
-TEST(LinuxFramesTest, OneMetadataBufferIsEnough) {
-  Fake fake;
-  SeenFrames seen;
-  fake.kernel->with((fake.kernel->roots().dev / "video13").string(),
-                    [](FakeNode& node) { return node.mostBuffers = 1; });
-  fake.prepare(kInfrared);
-  fake.handle(kInfrared, seen.handler());
-  ASSERT_EQ(fake.start(kInfrared), "done");
+TEST_F(LinuxFramesTest, OneMetadataBufferIsEnough) {
+  fake.kernel->with(fake.metadataNode, [](FakeNode& node) { return node.mostBuffers = 1; });
+  fake.begin(kInfrared, seen.handler());
   fake.kernel->passTime(330ms);
   EXPECT_EQ(seen.wait(10).size(), 10U);
   EXPECT_EQ(fake.counter(kInfrared, "MetadataErrorCount"), 0);
 }
 
-TEST(LinuxFramesTest, GapsAndDamagedBuffersAreCountedAndDamagedOnesAreNoFrames) {
-  Fake fake;
-  SeenFrames seen;
+TEST_F(LinuxFramesTest, GapsAndDamagedBuffersAreCountedAndDamagedOnesAreNoFrames) {
   fake.kernel->with(fake.nodes[0], [](FakeNode& node) { return node.delivers = false; });
-  fake.prepare(0);
-  fake.handle(0, seen.handler());
-  ASSERT_EQ(fake.start(0), "done");
+  fake.begin(0, seen.handler());
   fake.kernel->produce(fake.nodes[0]);
   fake.kernel->skip(fake.nodes[0], 4);
   fake.kernel->produce(fake.nodes[0], V4L2_BUF_FLAG_ERROR);
@@ -173,10 +140,8 @@ TEST(LinuxFramesTest, GapsAndDamagedBuffersAreCountedAndDamagedOnesAreNoFrames) 
   EXPECT_EQ(fake.counter(0, "SequenceGapCount"), 4) << "the counters stay";
 }
 
-TEST(LinuxFramesTest, ADisconnectIsCountedToldByTheStopAndOverWithTheNextUse) {
-  Fake fake;
-  fake.prepare(0);
-  ASSERT_EQ(fake.start(0), "done");
+TEST_F(LinuxFramesTest, ADisconnectIsCountedToldByTheStopAndOverWithTheNextUse) {
+  fake.begin(0);
   fake.kernel->passTime(330ms);
   fake.kernel->disconnect(fake.nodes[0]);
   while (fake.counter(0, "DisconnectCount") == 0) std::this_thread::yield();
@@ -192,10 +157,8 @@ TEST(LinuxFramesTest, ADisconnectIsCountedToldByTheStopAndOverWithTheNextUse) {
   EXPECT_EQ(fake.counter(0, "DisconnectCount"), 0);
 }
 
-TEST(LinuxFramesTest, AFatalErrorIsCountedAndTheStreamCanBeStartedAgain) {
-  Fake fake;
-  fake.prepare(0);
-  ASSERT_EQ(fake.start(0), "done");
+TEST_F(LinuxFramesTest, AFatalErrorIsCountedAndTheStreamCanBeStartedAgain) {
+  fake.begin(0);
   fake.kernel->breakStream(fake.nodes[0]);
   while (fake.counter(0, "StreamErrorCount") == 0) std::this_thread::yield();
   EXPECT_EQ(fake.stop(0), "done");
@@ -206,11 +169,9 @@ TEST(LinuxFramesTest, AFatalErrorIsCountedAndTheStreamCanBeStartedAgain) {
   EXPECT_EQ(fake.stop(0), "done");
 }
 
-TEST(LinuxFramesTest, AnEventWithoutABufferEndsTheStreamInsteadOfTurningOver) {
-  Fake fake;
+TEST_F(LinuxFramesTest, AnEventWithoutABufferEndsTheStreamInsteadOfTurningOver) {
   fake.kernel->with(fake.nodes[0], [](FakeNode& node) { return node.mostBuffers = 1; });
-  fake.prepare(0);
-  ASSERT_EQ(fake.start(0), "done");
+  fake.begin(0);
   ASSERT_TRUE(fake.kernel->settle());
   fake.kernel->failNext(fake.nodes[0], VIDIOC_QBUF, EINVAL);
   fake.kernel->produce(fake.nodes[0]);
@@ -220,10 +181,8 @@ TEST(LinuxFramesTest, AnEventWithoutABufferEndsTheStreamInsteadOfTurningOver) {
   EXPECT_EQ(fake.stop(0), "done");
 }
 
-TEST(LinuxFramesTest, ABufferThatTheDriverDoesNotTakeBackIsOfferedAgain) {
-  Fake fake;
-  fake.prepare(0);
-  ASSERT_EQ(fake.start(0), "done");
+TEST_F(LinuxFramesTest, ABufferThatTheDriverDoesNotTakeBackIsOfferedAgain) {
+  fake.begin(0);
   ASSERT_TRUE(fake.kernel->settle());
   fake.kernel->failNext(fake.nodes[0], VIDIOC_QBUF, EINVAL);
   fake.kernel->passTime(990ms);
@@ -232,7 +191,7 @@ TEST(LinuxFramesTest, ABufferThatTheDriverDoesNotTakeBackIsOfferedAgain) {
   EXPECT_EQ(fake.kernel->with(fake.nodes[0], [](auto& node) { return node.queued.size(); }), 4U);
 }
 
-TEST(LinuxFramesTest, WhateverFailsAtTheStartLeavesNothingBusy) {
+TEST(LinuxFramesOwnMachineTest, WhateverFailsAtTheStartLeavesNothingBusy) {
   Binding binding = fakeBinding();
   binding.cameras[kInfrared].errorCounters = {{"SIFErrorCount", {}, "Power"}};
   const struct {
@@ -271,7 +230,7 @@ TEST(LinuxFramesTest, WhateverFailsAtTheStartLeavesNothingBusy) {
   }
 }
 
-TEST(LinuxFramesTest, WhatTheSystemRefusesAtTheStartLeavesNothingBusy) {
+TEST(LinuxFramesOwnMachineTest, WhatTheSystemRefusesAtTheStartLeavesNothingBusy) {
   struct Row {
     const char* name;
     void (*break_)(Fake&);
@@ -290,9 +249,7 @@ TEST(LinuxFramesTest, WhatTheSystemRefusesAtTheStartLeavesNothingBusy) {
       {"no event for the thread", [](Fake& fake) { fake.kernel->makeEventProblem = EMFILE; },
        "1 eventfd on the capture device's thread failed: Too many open files (EMFILE)"},
       {"the metadata node's buffers",
-       [](Fake& fake) {
-         fake.kernel->failNext((fake.kernel->roots().dev / "video13").string(), VIDIOC_REQBUFS, EINVAL);
-       },
+       [](Fake& fake) { fake.kernel->failNext(fake.metadataNode, VIDIOC_REQBUFS, EINVAL); },
        "1 VIDIOC_REQBUFS on META failed: Invalid argument (EINVAL)"},
       {"a control of the metadata",
        [](Fake& fake) {
@@ -316,24 +273,18 @@ TEST(LinuxFramesTest, WhatTheSystemRefusesAtTheStartLeavesNothingBusy) {
     fake.handle(kInfrared, [](PixelBuffer&, MediaTime) {});
     ASSERT_EQ(fake.set(fake.infrared(), capture_key::InfraredLightSourceConfiguration, Fake::light(2)), "done");
     row.break_(fake);
-    std::string want = row.want;
-    if (const auto at = want.find("NODE"); at != std::string::npos) want.replace(at, 4, fake.nodes[kInfrared]);
-    if (const auto at = want.find("META"); at != std::string::npos) {
-      want.replace(at, 4, (fake.kernel->roots().dev / "video13").string());
-    }
-    EXPECT_EQ(fake.start(kInfrared), want) << row.name;
+    EXPECT_EQ(fake.start(kInfrared), fake.withPaths(row.want)) << row.name;
     fake.release();
     EXPECT_TRUE(fake.kernel->isIdle()) << row.name;
     EXPECT_EQ(fake.control(kStrobe), 0) << row.name;
   }
 }
 
-TEST(LinuxFramesTest, WhatFailsAtTheStopIsToldAndNothingStaysBusy) {
+TEST(LinuxFramesOwnMachineTest, WhatFailsAtTheStopIsToldAndNothingStaysBusy) {
   for (const auto& [request, name] : {std::pair<unsigned long, const char*>{VIDIOC_STREAMOFF, "VIDIOC_STREAMOFF"},
                                       {VIDIOC_REQBUFS, "VIDIOC_REQBUFS"}}) {
     Fake fake;
-    fake.prepare(0);
-    ASSERT_EQ(fake.start(0), "done");
+    fake.begin(0);
     fake.kernel->failNext(fake.nodes[0], request, EIO);
     EXPECT_EQ(fake.stop(0), "1 " + std::string(name) + " on " + fake.nodes[0] + " failed: Input/output error (EIO)");
     EXPECT_EQ(fake.stop(0), "7 BackFacingCamera is not running; it cannot be stopped.");
@@ -342,8 +293,7 @@ TEST(LinuxFramesTest, WhatFailsAtTheStopIsToldAndNothingStaysBusy) {
   }
 }
 
-TEST(LinuxFramesTest, TheProjectorIsLitBeforeTheFirstFrameAndOutAfterTheLast) {
-  Fake fake;
+TEST_F(LinuxFramesTest, TheProjectorIsLitBeforeTheFirstFrameAndOutAfterTheLast) {
   fake.prepare(kInfrared);
   ASSERT_EQ(fake.set(fake.infrared(), capture_key::InfraredLightSourceConfiguration, Fake::light(2, 1, 55)), "done");
   ASSERT_EQ(fake.start(kInfrared), "done");
@@ -353,8 +303,7 @@ TEST(LinuxFramesTest, TheProjectorIsLitBeforeTheFirstFrameAndOutAfterTheLast) {
   EXPECT_EQ(fake.kernel->with(fake.nodes[kInfrared], [](auto& node) { return node.history; }), want);
 }
 
-TEST(LinuxFramesTest, NothingIsGuardedWithoutAProjectorOrInTheDark) {
-  Fake fake;
+TEST_F(LinuxFramesTest, NothingIsGuardedWithoutAProjectorOrInTheDark) {
   fake.prepare(0);
   fake.prepare(kInfrared);
   ASSERT_EQ(fake.start(0), "done");
@@ -362,8 +311,7 @@ TEST(LinuxFramesTest, NothingIsGuardedWithoutAProjectorOrInTheDark) {
   EXPECT_EQ(fake.kernel->guards(), 0);
 }
 
-TEST(LinuxFramesTest, AProjectorThatCannotBePutOutIsToldAndLeftToTheGuard) {
-  Fake fake;
+TEST_F(LinuxFramesTest, AProjectorThatCannotBePutOutIsToldAndLeftToTheGuard) {
   fake.prepare(kInfrared);
   ASSERT_EQ(fake.set(fake.infrared(), capture_key::InfraredLightSourceConfiguration, Fake::light(2)), "done");
   ASSERT_EQ(fake.start(kInfrared), "done");
@@ -373,12 +321,11 @@ TEST(LinuxFramesTest, AProjectorThatCannotBePutOutIsToldAndLeftToTheGuard) {
   EXPECT_EQ(fake.control(kStrobe), 0);
 }
 
-TEST(LinuxFramesTest, ACounterThatVanishesMakesTheCountersUnreadableDuringAndAfterTheStream) {
+TEST(LinuxFramesOwnMachineTest, ACounterThatVanishesMakesTheCountersUnreadableDuringAndAfterTheStream) {
   Binding binding = fakeBinding();
   binding.cameras[kInfrared].errorCounters = {{"SIFErrorCount", {}, "Power"}};
   Fake fake(binding);
-  fake.prepare(kInfrared);
-  ASSERT_EQ(fake.start(kInfrared), "done");
+  fake.begin(kInfrared);
   EXPECT_EQ(fake.counter(kInfrared, "SIFErrorCount"), 0);
   fake.kernel->failNext(fake.nodes[kInfrared], VIDIOC_G_EXT_CTRLS, EIO, 100);
   const auto read = [&] {

@@ -10,17 +10,16 @@ namespace quazor {
 namespace {
 
 using Fake = FakeCameras;
+using LinuxFramesThreadsTest = FakeCamerasTest;
 using namespace std::chrono_literals;
 
-TEST(LinuxFramesThreadsTest, AHandlerMayReadStopAndLetGoOfEverything) {
-  Fake fake;
+TEST_F(LinuxFramesThreadsTest, AHandlerMayReadStopAndLetGoOfEverything) {
   std::mutex mutex;
   std::condition_variable changed;
   bool done = false;
   std::string stopped;
   std::string again;
-  fake.prepare(0);
-  fake.handle(0, [&](PixelBuffer&, MediaTime) {
+  fake.begin(0, [&](PixelBuffer&, MediaTime) {
     stopped = fake.stop(0);
     again = fake.stop(0);
     EXPECT_EQ(fake.counter(0, "StreamErrorCount"), 0);
@@ -29,7 +28,6 @@ TEST(LinuxFramesThreadsTest, AHandlerMayReadStopAndLetGoOfEverything) {
     done = true;
     changed.notify_all();
   });
-  ASSERT_EQ(fake.start(0), "done");
   fake.kernel->produce(fake.nodes[0]);
   std::unique_lock lock(mutex);
   ASSERT_TRUE(changed.wait_for(lock, 1min, [&] { return done; }));
@@ -39,11 +37,8 @@ TEST(LinuxFramesThreadsTest, AHandlerMayReadStopAndLetGoOfEverything) {
   EXPECT_TRUE(fake.kernel->isIdle());
 }
 
-TEST(LinuxFramesThreadsTest, AHandlerMayLetGoOfAStreamThatRuns) {
-  Fake fake;
-  fake.prepare(0);
-  fake.handle(0, [&](PixelBuffer&, MediaTime) { fake.release(); });
-  ASSERT_EQ(fake.start(0), "done");
+TEST_F(LinuxFramesThreadsTest, AHandlerMayLetGoOfAStreamThatRuns) {
+  fake.begin(0, [&](PixelBuffer&, MediaTime) { fake.release(); });
   fake.kernel->produce(fake.nodes[0]);
   for (int i = 0; i < 30'000 && !fake.kernel->isIdle(); ++i) std::this_thread::sleep_for(1ms);
   EXPECT_TRUE(fake.kernel->isIdle());
@@ -75,14 +70,13 @@ class Gate {
   bool open_ = false;
 };
 
-TEST(LinuxFramesThreadsTest, ASystemWithoutMemoryForAThreadIsTold) {
+TEST_F(LinuxFramesThreadsTest, ASystemWithoutMemoryForAThreadIsTold) {
   pthread_attr_t before;
   pthread_attr_t huge;
   ASSERT_EQ(::pthread_getattr_default_np(&before), 0);
   ASSERT_EQ(::pthread_attr_init(&huge), 0);
   ASSERT_EQ(::pthread_attr_setstacksize(&huge, std::size_t{1} << 48), 0);
   ASSERT_EQ(::pthread_setattr_default_np(&huge), 0);
-  Fake fake;
   fake.prepare(0);
   EXPECT_EQ(fake.start(0),
             "1 pthread_create on the capture device's thread failed: Resource temporarily unavailable (EAGAIN)");
@@ -90,17 +84,14 @@ TEST(LinuxFramesThreadsTest, ASystemWithoutMemoryForAThreadIsTold) {
   EXPECT_EQ(fake.start(0), "done");
 }
 
-TEST(LinuxFramesThreadsTest, AStopWaitsForTheHandlerThatRuns) {
-  Fake fake;
+TEST_F(LinuxFramesThreadsTest, AStopWaitsForTheHandlerThatRuns) {
   Gate gate;
   std::atomic<bool> left = false;
-  fake.prepare(0);
-  fake.handle(0, [&](PixelBuffer&, MediaTime) {
+  fake.begin(0, [&](PixelBuffer&, MediaTime) {
     gate.enter();
     std::this_thread::sleep_for(3ms);
     left = true;
   });
-  ASSERT_EQ(fake.start(0), "done");
   fake.kernel->produce(fake.nodes[0]);
   gate.awaitEntry();
   std::thread opener([&] {
@@ -112,15 +103,12 @@ TEST(LinuxFramesThreadsTest, AStopWaitsForTheHandlerThatRuns) {
   opener.join();
 }
 
-TEST(LinuxFramesThreadsTest, InvalidatingWaitsForTheHandlerThatStops) {
-  Fake fake;
+TEST_F(LinuxFramesThreadsTest, InvalidatingWaitsForTheHandlerThatStops) {
   Gate gate;
   fake.kernel->beforeCall = [&gate](unsigned long request) {
     if (request == VIDIOC_STREAMOFF) gate.enter();
   };
-  fake.prepare(0);
-  fake.handle(0, [&](PixelBuffer&, MediaTime) { fake.stop(0); });
-  ASSERT_EQ(fake.start(0), "done");
+  fake.begin(0, [&](PixelBuffer&, MediaTime) { fake.stop(0); });
   fake.kernel->produce(fake.nodes[0]);
   gate.awaitEntry();
   std::thread opener([&gate] {
@@ -132,15 +120,13 @@ TEST(LinuxFramesThreadsTest, InvalidatingWaitsForTheHandlerThatStops) {
   opener.join();
 }
 
-TEST(LinuxFramesThreadsTest, WhatIsInvalidatedWhileItIsStoppedIsFreeAfterTheStopAndTheNextUsersThen) {
-  Fake fake;
+TEST_F(LinuxFramesThreadsTest, WhatIsInvalidatedWhileItIsStoppedIsFreeAfterTheStopAndTheNextUsersThen) {
   Gate gate;
   fake.kernel->beforeCall = [&gate](unsigned long request) {
     if (request == VIDIOC_STREAMOFF) gate.enter();
   };
-  fake.prepare(0);
-  ASSERT_EQ(fake.start(0), "done");
-  std::thread stopper([&fake] { EXPECT_EQ(fake.stop(0), "done"); });
+  fake.begin(0);
+  std::thread stopper([this] { EXPECT_EQ(fake.stop(0), "done"); });
   gate.awaitEntry();
   EXPECT_TRUE(fake.device->invalidate(nullptr));
   gate.open();
@@ -149,22 +135,19 @@ TEST(LinuxFramesThreadsTest, WhatIsInvalidatedWhileItIsStoppedIsFreeAfterTheStop
   EXPECT_TRUE(fake.kernel->isIdle());
   fake.device = fake.capture->defaultPlugIn()->device(nullptr);
   fake.streams = *fake.device->streams(nullptr);
-  fake.prepare(0);
-  ASSERT_EQ(fake.start(0), "done");
+  fake.begin(0);
   ASSERT_EQ(fake.stop(0), "done");
   EXPECT_EQ(fake.set(fake.wide(), capture_key::FormatIndex, 1), "done") << "it is still under control";
 }
 
-TEST(LinuxFramesThreadsTest, WhileAHandlerStopsOneThreadMayInvalidateAndAnotherTakeTheCamera) {
+TEST(LinuxFramesThreadsOwnMachineTest, WhileAHandlerStopsOneThreadMayInvalidateAndAnotherTakeTheCamera) {
   for (int i = 0; i < 30; ++i) {
     Fake fake;
     Gate gate;
-    fake.prepare(0);
-    fake.handle(0, [&](PixelBuffer&, MediaTime) {
+    fake.begin(0, [&](PixelBuffer&, MediaTime) {
       gate.enter();
       fake.stop(0);
     });
-    ASSERT_EQ(fake.start(0), "done");
     fake.kernel->produce(fake.nodes[0]);
     gate.awaitEntry();
     std::thread taker([capture = fake.capture] {
@@ -182,16 +165,13 @@ TEST(LinuxFramesThreadsTest, WhileAHandlerStopsOneThreadMayInvalidateAndAnotherT
   }
 }
 
-TEST(LinuxFramesThreadsTest, WhileOneThreadStopsAHandlerMayInvalidate) {
-  Fake fake;
+TEST_F(LinuxFramesThreadsTest, WhileOneThreadStopsAHandlerMayInvalidate) {
   Gate gate;
   std::string stopped;
-  fake.prepare(0);
-  fake.handle(0, [&](PixelBuffer&, MediaTime) {
+  fake.begin(0, [&](PixelBuffer&, MediaTime) {
     gate.enter();
     static_cast<void>(fake.device->invalidate(nullptr));
   });
-  ASSERT_EQ(fake.start(0), "done");
   fake.kernel->produce(fake.nodes[0]);
   gate.awaitEntry();
   std::thread stopper([&] { stopped = fake.stop(0); });

@@ -4,6 +4,7 @@ namespace quazor {
 namespace {
 
 using Fake = FakeCameras;
+using LinuxGroupTest = FakeCamerasTest;
 using namespace std::chrono_literals;
 
 Array arrayOf(const CaptureStreams& streams) { return Array(streams.begin(), streams.end()); }
@@ -27,8 +28,7 @@ std::pair<std::int64_t, std::int64_t> status(const Fake& fake, std::string_view 
 
 using Pair = std::pair<std::int64_t, std::int64_t>;
 
-TEST(LinuxGroupTest, ALateStartIsAnOffsetInFramesFromTheMastersFirst) {
-  Fake fake;
+TEST_F(LinuxGroupTest, ALateStartIsAnOffsetInFramesFromTheMastersFirst) {
   synchronize(fake);
   ASSERT_EQ(fake.start(0), "done");
   ASSERT_EQ(fake.start(1), "done");
@@ -40,8 +40,7 @@ TEST(LinuxGroupTest, ALateStartIsAnOffsetInFramesFromTheMastersFirst) {
   EXPECT_EQ(status(fake, port_type::BackFacingSuperWideCamera), Pair(3, 30));
 }
 
-TEST(LinuxGroupTest, ACameraThatCameBeforeTheMasterHasANegativeOffset) {
-  Fake fake;
+TEST_F(LinuxGroupTest, ACameraThatCameBeforeTheMasterHasANegativeOffset) {
   synchronize(fake);
   ASSERT_EQ(fake.start(1), "done");
   fake.kernel->passTime(70ms);
@@ -50,8 +49,7 @@ TEST(LinuxGroupTest, ACameraThatCameBeforeTheMasterHasANegativeOffset) {
   EXPECT_EQ(status(fake, port_type::BackFacingTelephotoCamera).first, -2);
 }
 
-TEST(LinuxGroupTest, ACameraWithoutFramesHasRecordedNone) {
-  Fake fake;
+TEST_F(LinuxGroupTest, ACameraWithoutFramesHasRecordedNone) {
   fake.kernel->with(fake.nodes[1], [](FakeNode& node) { return node.delivers = false; });
   synchronize(fake);
   ASSERT_EQ(fake.start(0), "done");

@@ -7,13 +7,13 @@ namespace quazor {
 namespace {
 
 using Fake = FakeCameras;
+using LinuxStreamTest = FakeCamerasTest;
 
 std::optional<Value> get(const Fake& fake, std::string_view key, std::size_t index = 0) {
   return fake.streams[index]->valueForProperty(key, nullptr);
 }
 
-TEST(LinuxStreamTest, AStreamThatWasNotTouchedHasTheUsualProperties) {
-  Fake fake;
+TEST_F(LinuxStreamTest, AStreamThatWasNotTouchedHasTheUsualProperties) {
   EXPECT_EQ(get(fake, capture_key::PortType), Value("BackFacingCamera"));
   EXPECT_EQ(get(fake, capture_key::FormatIndex), Value(0U));
   EXPECT_EQ(get(fake, capture_key::MinimumFrameRate), std::nullopt);
@@ -29,7 +29,7 @@ TEST(LinuxStreamTest, AStreamThatWasNotTouchedHasTheUsualProperties) {
             "7 BackFacingCamera: MaximumFrameRate cannot be read before it is set.");
 }
 
-TEST(LinuxStreamTest, WhatNoVideoNodeCanDoIsRefused) {
+TEST_F(LinuxStreamTest, WhatNoVideoNodeCanDoIsRefused) {
   const auto slave = [](bool outputs, bool skipping, int ratio) {
     return Value(Dictionary{{text(capture_key::StreamingOutputsEnabled), outputs},
                             {text(capture_key::FrameSkippingEnabled), skipping},
@@ -38,7 +38,6 @@ TEST(LinuxStreamTest, WhatNoVideoNodeCanDoIsRefused) {
   };
   constexpr std::string_view kSlave = capture_key::SynchronizedStreamsSlaveConfiguration;
   const std::string name = "FrontFacingInfraredCamera: ";
-  Fake fake;
   ASSERT_EQ(fake.take(3), "done");
   const auto set = [&](std::string_view key, const Value& value) { return fake.set(fake.infrared(), key, value); };
   EXPECT_EQ(set(kSlave, slave(true, false, 2)),
@@ -55,7 +54,7 @@ TEST(LinuxStreamTest, WhatNoVideoNodeCanDoIsRefused) {
             "6 " + name + "MaximumFrameRate must be a number above 0 and at most 10000, not the number 10001.");
 }
 
-TEST(LinuxStreamTest, AFormatThatIsNotThereOrHasAnotherSizeIsRefused) {
+TEST(LinuxStreamOwnMachineTest, AFormatThatIsNotThereOrHasAnotherSizeIsRefused) {
   Binding binding = fakeBinding();
   binding.cameras[1].width = 800;
   Fake fake(binding);
@@ -66,7 +65,7 @@ TEST(LinuxStreamTest, AFormatThatIsNotThereOrHasAnotherSizeIsRefused) {
       "5 " + fake.nodes[1] + ": format 1 (GREY) of 800 x 360 is not available; the driver offers GREY of 640 x 360.");
 }
 
-TEST(LinuxStreamTest, ARateThatTheDriverSilentlyChangesIsRefusedWithTheDriversOwn) {
+TEST(LinuxStreamOwnMachineTest, ARateThatTheDriverSilentlyChangesIsRefusedWithTheDriversOwn) {
   Binding binding = fakeBinding();
   binding.cameras[0].height = 480;
   Fake fake(binding);
@@ -80,7 +79,7 @@ TEST(LinuxStreamTest, ARateThatTheDriverSilentlyChangesIsRefusedWithTheDriversOw
   EXPECT_EQ(get(fake, capture_key::MaximumFrameRate), std::nullopt);
 }
 
-TEST(LinuxStreamTest, RatesThatAreNearEnoughOrWithinTheRangeAreTaken) {
+TEST(LinuxStreamOwnMachineTest, RatesThatAreNearEnoughOrWithinTheRangeAreTaken) {
   const struct {
     const char* name;
     double lowest;
@@ -104,7 +103,7 @@ TEST(LinuxStreamTest, RatesThatAreNearEnoughOrWithinTheRangeAreTaken) {
   }
 }
 
-TEST(LinuxStreamTest, RatesAreCheckedAtTheStartAnew) {
+TEST(LinuxStreamOwnMachineTest, RatesAreCheckedAtTheStartAnew) {
   Binding binding = fakeBinding();
   Fake fake(binding);
   fake.prepare(0);
@@ -116,7 +115,7 @@ TEST(LinuxStreamTest, RatesAreCheckedAtTheStartAnew) {
   EXPECT_EQ(fake.kernel->with(fake.nodes[0], [](auto& node) { return node.buffers; }), 0U);
 }
 
-TEST(LinuxStreamTest, OneRateAloneIsABoundAndNoneLeavesTheDriversOwn) {
+TEST(LinuxStreamOwnMachineTest, OneRateAloneIsABoundAndNoneLeavesTheDriversOwn) {
   const auto rateAfter = [](std::string_view key, double rate) {
     Fake fake;
     EXPECT_EQ(fake.take(0), "done");
@@ -133,8 +132,7 @@ TEST(LinuxStreamTest, OneRateAloneIsABoundAndNoneLeavesTheDriversOwn) {
   EXPECT_EQ(fake.kernel->with(fake.nodes[0], [](auto& node) { return node.interval.denominator; }), 5U);
 }
 
-TEST(LinuxStreamTest, ADriverThatSetsNoRatesIsRefused) {
-  Fake fake;
+TEST_F(LinuxStreamTest, ADriverThatSetsNoRatesIsRefused) {
   ASSERT_EQ(fake.take(0), "done");
   ASSERT_EQ(fake.set(fake.wide(), capture_key::MinimumFrameRate, 30), "done");
   fake.kernel->failNext(fake.nodes[0], VIDIOC_S_PARM, ENOTTY);
@@ -142,15 +140,14 @@ TEST(LinuxStreamTest, ADriverThatSetsNoRatesIsRefused) {
             "1 VIDIOC_S_PARM on " + fake.nodes[0] + " failed: Inappropriate ioctl for device (ENOTTY)");
 }
 
-TEST(LinuxStreamTest, TheIntervalOfARateIsTheShortestFraction) {
+TEST(LinuxStreamOwnMachineTest, TheIntervalOfARateIsTheShortestFraction) {
   EXPECT_EQ(intervalFor(30), (FrameInterval{1, 30}));
   EXPECT_EQ(intervalFor(29.97), (FrameInterval{1000, 29970}));
   EXPECT_EQ(intervalFor(0.5), (FrameInterval{1000, 500}));
   EXPECT_EQ(intervalFor(0.01), (FrameInterval{1000, 10}));
 }
 
-TEST(LinuxStreamTest, AutomaticExposureIsTheControlOfThatName) {
-  Fake fake;
+TEST_F(LinuxStreamTest, AutomaticExposureIsTheControlOfThatName) {
   const auto exposure = [&](std::int64_t usual) {
     fake.kernel->with(fake.nodes[0], [usual](FakeNode& node) {
       node.controls = {{V4L2_CID_EXPOSURE_AUTO, "Auto Exposure", 0, 3, usual, V4L2_CTRL_TYPE_MENU}};
@@ -177,7 +174,7 @@ TEST(LinuxStreamTest, AutomaticExposureIsTheControlOfThatName) {
   EXPECT_EQ(get(fake, capture_key::AEEnabled), Value(true));
 }
 
-TEST(LinuxStreamTest, AutomaticExposureIsAsTheDriverHasItWhenControlIsTaken) {
+TEST(LinuxStreamOwnMachineTest, AutomaticExposureIsAsTheDriverHasItWhenControlIsTaken) {
   const struct {
     const char* name;
     std::int64_t value;
@@ -201,8 +198,7 @@ TEST(LinuxStreamTest, AutomaticExposureIsAsTheDriverHasItWhenControlIsTaken) {
   }
 }
 
-TEST(LinuxStreamTest, ACameraWithoutAutomaticExposureCanOnlyBeWithout) {
-  Fake fake;
+TEST_F(LinuxStreamTest, ACameraWithoutAutomaticExposureCanOnlyBeWithout) {
   ASSERT_EQ(fake.take(0), "done");
   EXPECT_EQ(get(fake, capture_key::AEEnabled), Value(false));
   EXPECT_EQ(fake.set(fake.wide(), capture_key::AEEnabled, false), "done");
@@ -210,8 +206,7 @@ TEST(LinuxStreamTest, ACameraWithoutAutomaticExposureCanOnlyBeWithout) {
             "5 BackFacingCamera: " + fake.nodes[0] + " has no automatic exposure.");
 }
 
-TEST(LinuxStreamTest, AProjectorsSetOfBitsTakesEveryNumber) {
-  Fake fake;
+TEST_F(LinuxStreamTest, AProjectorsSetOfBitsTakesEveryNumber) {
   fake.kernel->with(fake.nodes[3], [](FakeNode& node) {
     FakeControl& power = *std::ranges::find(node.controls, kPower, &FakeControl::id);
     power.type = V4L2_CTRL_TYPE_BITMASK;
@@ -223,7 +218,7 @@ TEST(LinuxStreamTest, AProjectorsSetOfBitsTakesEveryNumber) {
   EXPECT_EQ(fake.control(kPower), 5);
 }
 
-TEST(LinuxStreamTest, AProjectorsControlMustBeThere) {
+TEST(LinuxStreamOwnMachineTest, AProjectorsControlMustBeThere) {
   Binding binding = fakeBinding();
   binding.cameras[3].projector->modeControl = "Flash Mode";
   Fake fake(binding);

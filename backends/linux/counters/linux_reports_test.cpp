@@ -17,7 +17,6 @@ namespace quazor {
 namespace {
 
 using ::testing::ElementsAre;
-using ::testing::IsEmpty;
 
 Binding bindingOf(std::string path, std::optional<std::string> key = std::nullopt) {
   Binding binding;
@@ -72,7 +71,7 @@ TEST_F(LinuxReportsTest, FilteringLeavesTheSetAsItIs) {
   EXPECT_THAT(snapshotOf(filtered), ElementsAre("a=1", "c=3"));
   EXPECT_THAT(snapshotOf(filtered->reportByFilteringChannels([](const auto& one) { return one.name == "c"; })),
               ElementsAre("c=3"));
-  EXPECT_THAT(snapshotOf(filtered->reportByFilteringChannels([](const auto&) { return false; })), IsEmpty());
+  EXPECT_THAT(snapshotOf(filtered->reportByFilteringChannels([](const auto&) { return false; })), testing::IsEmpty());
   EXPECT_THAT(snapshotOf(set), ElementsAre("a=1", "b=2", "c=3"));
 }
 
@@ -83,7 +82,7 @@ TEST_F(LinuxReportsTest, ChannelsAreThoseOfTheMomentOfTheCall) {
   system_->files["/c/b"] = "2";
   EXPECT_THAT(snapshotOf(before), ElementsAre("a=1"));
   EXPECT_THAT(snapshotOf(facility->reportWithOnlySimpleChannels(nullptr)), ElementsAre("a=1", "b=2"));
-  EXPECT_THAT(snapshotOf(setOf(Binding())), IsEmpty());
+  EXPECT_THAT(snapshotOf(setOf(Binding())), testing::IsEmpty());
 }
 
 TEST_F(LinuxReportsTest, ReadsAFileOfManyChannelsOnce) {

@@ -3,6 +3,7 @@
 #include "base/text/input_error.h"
 
 #include "contract/value.h"
+#include "tests/support/thrown_text.h"
 
 #include <gmock/gmock.h>
 #include <gtest/gtest.h>
@@ -16,7 +17,6 @@ namespace quazor {
 namespace {
 
 using ::testing::ElementsAre;
-using ::testing::IsEmpty;
 using ::testing::Pair;
 
 // An image sensor: input report 0x76 of 791 bytes after its ID, feature reports 0xAB and 0xAC of one byte.
@@ -34,12 +34,7 @@ HidReportDescriptor parsed(const Bytes& bytes) { return parseHidReportDescriptor
 
 // Empty if the descriptor is valid.
 std::string problemOf(const Bytes& bytes) {
-  try {
-    parseHidReportDescriptor(bytes);
-  } catch (const InputError& problem) {
-    return problem.what();
-  }
-  return {};
+  return thrownText<InputError>([&] { parseHidReportDescriptor(bytes); }, "");
 }
 
 Bytes repeated(const Bytes& item, std::size_t times) {
@@ -67,13 +62,13 @@ TEST(HidReportDescriptorTest, ADeviceWithoutReportIDsHasOneReport) {
   EXPECT_THAT(mouse.topLevel, ElementsAre(HidUsage{1, 2}));
   EXPECT_FALSE(mouse.numbered);
   EXPECT_THAT(mouse.inputReports, ElementsAre(Pair(0, 3U)));
-  EXPECT_THAT(mouse.featureReports, IsEmpty());
+  EXPECT_THAT(mouse.featureReports, testing::IsEmpty());
 }
 
 TEST(HidReportDescriptorTest, TopLevelCollectionsAreListedInTheirOrder) {
   const Bytes both = joined({kMouse, kSensor});
   EXPECT_THAT(parsed(both).topLevel, ElementsAre(HidUsage{1, 2}, HidUsage{0xFF00, 0x24}));
-  EXPECT_THAT(parsed({}).topLevel, IsEmpty());
+  EXPECT_THAT(parsed({}).topLevel, testing::IsEmpty());
 }
 
 TEST(HidReportDescriptorTest, UsagesOfCollections) {

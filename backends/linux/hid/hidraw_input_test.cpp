@@ -28,7 +28,6 @@ namespace {
 
 using namespace std::chrono_literals;
 using ::testing::ElementsAre;
-using ::testing::IsEmpty;
 using ::testing::SizeIs;
 
 constexpr std::string_view kOther = "org.quazor.other";
@@ -250,7 +249,7 @@ TEST_F(HidrawInputTest, AClosedDeviceGivesNothingAndItsDescriptorIsClosedAtOnce)
   EXPECT_EQ(::fcntl(descriptor, F_GETFD), -1);
   EXPECT_EQ(input_->descriptor(), nullptr);
   run();
-  EXPECT_THAT(seen_, IsEmpty());
+  EXPECT_THAT(seen_, testing::IsEmpty());
   input_->close();
   open();
   send(2);

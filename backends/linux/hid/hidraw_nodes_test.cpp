@@ -14,7 +14,6 @@ namespace {
 
 using ::testing::ElementsAre;
 using ::testing::IsEmpty;
-using ::testing::Pair;
 using ::testing::SizeIs;
 
 class HidrawNodesTest : public ::testing::Test {
@@ -38,7 +37,7 @@ TEST_F(HidrawNodesTest, ANodeSaysAllThatTheKernelShowsOfItsDevice) {
   EXPECT_EQ(node.device.filename(), "0003:1209:0001.hidraw31");
   EXPECT_EQ(node.rawDescriptor, sensorDescriptor());
   EXPECT_THAT(node.descriptor.topLevel, ElementsAre(HidUsage{0xFF00, 0x24}));
-  EXPECT_THAT(node.descriptor.inputReports, ElementsAre(Pair(0x76, 792U)));
+  EXPECT_THAT(node.descriptor.inputReports, ElementsAre(testing::Pair(0x76, 792U)));
   EXPECT_EQ(node.problem, "");
   EXPECT_EQ(node.noAccess, "");
 }

@@ -22,7 +22,6 @@ namespace fs = std::filesystem;
 using ::testing::Contains;
 using ::testing::ElementsAre;
 using ::testing::HasSubstr;
-using ::testing::Not;
 
 class ProbeTest : public ::testing::Test {
  protected:
@@ -250,7 +249,7 @@ TEST_F(ProbeTest, BindsTheCountersThatThereAre) {
 
 TEST_F(ProbeTest, BindsNoTracepointThatIsNotThereOrMayNotBeCounted) {
   counters_->files = {{"/sys/kernel/tracing/events/v4l2/other/id", "7\n"}};
-  EXPECT_THAT(lines(), Not(Contains(HasSubstr("may not count them"))));
+  EXPECT_THAT(lines(), testing::Not(Contains(HasSubstr("may not count them"))));
   EXPECT_TRUE(binding_.tracepoints.empty());
   counters_->files = {{"/sys/kernel/tracing/events/v4l2/v4l2_dqbuf/id", "7\n"}};
   counters_->tracepointFailures = {{{7, 0}, EACCES}};

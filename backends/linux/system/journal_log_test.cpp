@@ -31,7 +31,6 @@ namespace {
 using namespace std::chrono_literals;
 using namespace std::string_literals;
 using ::testing::ElementsAre;
-using ::testing::HasSubstr;
 using ::testing::IsEmpty;
 using ::testing::StartsWith;
 
@@ -119,6 +118,10 @@ class JournalLogTest : public ::testing::Test {
 
   void startJournal() { journal_.emplace(path_); }
   std::string received() { return journal_->receive().value_or("nothing"); }
+  void expectArrives(JournalLog& log, LogLevel level, const std::string& text) {
+    log.write(level, "s", "c", text);
+    EXPECT_THAT(received(), StartsWith("MESSAGE=" + text + '\n'));
+  }
   std::vector<std::string> textsOfFallback() const {
     std::vector<std::string> texts;
     for (const LogRecord& record : fallback_->records()) texts.push_back(record.text);
@@ -159,7 +162,7 @@ TEST_F(JournalLogTest, EachLevelHasItsPriority) {
   };
   for (const auto& row : kRows) {
     log.write(row.level, "s", "c", "text");
-    EXPECT_THAT(received(), HasSubstr(row.field));
+    EXPECT_THAT(received(), testing::HasSubstr(row.field));
   }
 }
 
@@ -204,8 +207,7 @@ TEST_F(JournalLogTest, WhatIsTooLongForADatagramArrivesInASealedFile) {
   const std::string fields = received();
   EXPECT_TRUE(journal_->cameInAFile);
   EXPECT_TRUE(fields == "MESSAGE=" + text + "\n" + std::string(kRest)) << fields.size();
-  log.write(LogLevel::kError, "s", "c", "short");
-  EXPECT_THAT(received(), StartsWith("MESSAGE=short\n"));
+  expectArrives(log, LogLevel::kError, "short");
   EXPECT_FALSE(journal_->cameInAFile);
   EXPECT_THAT(textsOfFallback(), IsEmpty());
 }
@@ -281,14 +283,12 @@ TEST_F(JournalLogTest, ASocketThatNobodyListensOnAnyMoreCountsAsNone) {
 TEST_F(JournalLogTest, AJournalThatIsRestartedIsFoundAgain) {
   startJournal();
   JournalLog log(fallback_, path_);
-  log.write(LogLevel::kError, "s", "c", "before");
-  EXPECT_THAT(received(), StartsWith("MESSAGE=before\n"));
+  expectArrives(log, LogLevel::kError, "before");
   journal_.reset();
   log.write(LogLevel::kError, "s", "c", "between");
   EXPECT_THAT(textsOfFallback(), ElementsAre("between"));
   startJournal();
-  log.write(LogLevel::kError, "s", "c", "after");
-  EXPECT_THAT(received(), StartsWith("MESSAGE=after\n"));
+  expectArrives(log, LogLevel::kError, "after");
   EXPECT_THAT(textsOfFallback(), ElementsAre("between"));
 }
 
@@ -304,11 +304,9 @@ TEST_F(JournalLogTest, AJournalThatDoesNotReadIsWaitedForOnceAndToldWhatItMissed
   EXPECT_LT(std::chrono::steady_clock::now() - afterTheFirst, 99 * 90ms / 4);
   for (int i = 0; i < fillers; ++i) EXPECT_EQ(received(), "filler");
   EXPECT_EQ(received(), "nothing");
-  log.write(LogLevel::kDebug, "s", "c", "taken");
-  EXPECT_THAT(received(), StartsWith("MESSAGE=taken\n"));
+  expectArrives(log, LogLevel::kDebug, "taken");
   EXPECT_EQ(received(), "MESSAGE=the journal did not accept 100 log lines before this one\n" + std::string(kRest));
-  log.write(LogLevel::kDebug, "s", "c", "taken too");
-  EXPECT_THAT(received(), StartsWith("MESSAGE=taken too\n"));
+  expectArrives(log, LogLevel::kDebug, "taken too");
   EXPECT_EQ(received(), "nothing");
   EXPECT_THAT(textsOfFallback(), IsEmpty());
 }
@@ -323,8 +321,7 @@ TEST_F(JournalLogTest, WhatWasMissedIsToldLaterWhenThereIsNoPlaceForIt) {
   for (int i = 1; i < fillers; ++i) EXPECT_EQ(received(), "filler");
   EXPECT_THAT(received(), StartsWith("MESSAGE=in the one place\n"));
   EXPECT_EQ(received(), "nothing");
-  log.write(LogLevel::kError, "s", "c", "next");
-  EXPECT_THAT(received(), StartsWith("MESSAGE=next\n"));
+  expectArrives(log, LogLevel::kError, "next");
   EXPECT_THAT(received(), StartsWith("MESSAGE=the journal did not accept 1 log lines"));
 }
 

@@ -42,7 +42,7 @@ TEST_F(SimulatedCaptureTest, ObjectsDescribeThemselves) {
 TEST_F(SimulatedCaptureTest, ARunningStreamIsNotGivenBack) {
   ASSERT_TRUE(user_.control({user_.streams[0]}) && user_.wide().start(nullptr));
   EXPECT_EQ(relinquish(user_, {user_.streams[0]}),
-            refusal(Code::kWrongState, "wide is running; stop it before releasing control."));
+            refusal(Code::kWrongState, "wide is running; stop it before giving it back."));
 }
 
 TEST_F(SimulatedCaptureTest, StreamsOfOthersAreRefused) {

@@ -17,7 +17,6 @@ namespace {
 
 using namespace std::chrono_literals;
 using ::testing::ElementsAre;
-using ::testing::IsEmpty;
 
 ReportChannelConfig channel(const char* group, const char* subGroup, const char* name,
                             std::optional<std::uint64_t> count) {
@@ -79,7 +78,7 @@ TEST_F(SimulatedReportsTest, ASnapshotHasTheChannelsInTheScenariosOrder) {
 
 TEST_F(SimulatedReportsTest, APhoneMayHaveNoChannels) {
   make({});
-  EXPECT_THAT(texts(simple()->snapshot(nullptr)), IsEmpty());
+  EXPECT_THAT(texts(simple()->snapshot(nullptr)), testing::IsEmpty());
 }
 
 TEST_F(SimulatedReportsTest, FilteringMakesANewSetAndLeavesTheOldOne) {

@@ -13,8 +13,6 @@
 namespace quazor {
 namespace {
 
-using ::testing::ElementsAre;
-
 class SimulatedFramebufferTest : public ::testing::Test {
  protected:
   void make(const DisplayConfig& display) {
@@ -83,9 +81,10 @@ TEST_F(SimulatedFramebufferTest, FaultsAndObserversReachEveryOperation) {
   answerNothing(sensor_operation::kMainDisplay, std::nullopt);
   EXPECT_EQ(display(), nullptr);
   for (const FaultStatus& status : phone_->faultStatus()) EXPECT_EQ(status.fired, 1U) << status.fault.operation;
-  EXPECT_THAT(calls, ElementsAre("FramebufferService.mainDisplay||+", "Display.registryService||+",
-                                 "RegistryService.registryProperty|Name|-", "RegistryService.registryProperty|Power|+",
-                                 "Display.registryService||-", "FramebufferService.mainDisplay||-"));
+  EXPECT_THAT(
+      calls, testing::ElementsAre("FramebufferService.mainDisplay||+", "Display.registryService||+",
+                                  "RegistryService.registryProperty|Name|-", "RegistryService.registryProperty|Power|+",
+                                  "Display.registryService||-", "FramebufferService.mainDisplay||-"));
 }
 
 }  // namespace

@@ -15,7 +15,6 @@ namespace {
 using namespace std::chrono_literals;
 using ::testing::Each;
 using ::testing::ElementsAre;
-using ::testing::SizeIs;
 
 std::uint32_t read32(const Bytes& bytes, std::size_t at) {
   return static_cast<std::uint32_t>(bytes.at(at)) | static_cast<std::uint32_t>(bytes.at(at + 1)) << 8U |
@@ -32,7 +31,7 @@ TEST(HidImageReportTest, AWholeReportHasEveryFieldInItsPlace) {
   images.firstFrameID = 0x01020300;
   images.temperature = 36.6F;
   const Bytes bytes = hidInputReport(images, {}, 4, 0x0A0B0C0D * 1ms + 999us);
-  ASSERT_THAT(bytes, SizeIs(792));
+  ASSERT_THAT(bytes, testing::SizeIs(792));
   EXPECT_EQ(bytes[0], 0x76);
   EXPECT_EQ(read32(bytes, 4), 0x01020304U);
   EXPECT_EQ(bytes[4], 0x04);
@@ -100,7 +99,7 @@ TEST(HidImageReportTest, AShapeChangesTheIDAndTheLength) {
   EXPECT_THAT(hidInputReport({}, shape, 0, 0ms), ElementsAre(0x75));
   shape.length = 800;
   const Bytes longer = hidInputReport({}, shape, 0, 0ms);
-  ASSERT_THAT(longer, SizeIs(800));
+  ASSERT_THAT(longer, testing::SizeIs(800));
   EXPECT_THAT(samples(longer, 792, 2), Each(0));
   EXPECT_EQ(std::bit_cast<float>(read32(longer, 788)), 25.0F);
 }

@@ -17,7 +17,6 @@ namespace {
 
 using namespace std::chrono_literals;
 using ::testing::ElementsAre;
-using ::testing::IsEmpty;
 using ::testing::SizeIs;
 
 // An inbox on a loop in virtual time. Reports are recorded by their ID, errors as -1.
@@ -133,7 +132,7 @@ TEST_F(HidInboxTest, AUserThatIsGoneLeavesNothingInTheLoop) {
   inbox_ = nullptr;
   EXPECT_EQ(loop_->runInMode(kRunLoopDefaultMode, 1s, false), RunLoopResult::kFinished);
   EXPECT_EQ(loop_->runInMode("narrow", 1s, false), RunLoopResult::kFinished);
-  EXPECT_THAT(seen_, IsEmpty());
+  EXPECT_THAT(seen_, testing::IsEmpty());
 }
 
 TEST_F(HidInboxTest, TheReceiverGoesWithItsUser) {

@@ -66,7 +66,7 @@ bool HidSensor::checkFeature(std::uint8_t reportID, std::span<const std::uint8_t
                   name, config_.name);
   }
   if (!report->accepts.empty() && !report->accepts.contains(payload[1])) {
-    return refuse(error, HidErrorCode::kRefusedReport, "Feature report %@ of %@ does not accept the value %@.", name,
+    return refuse(error, HidErrorCode::kRefusedReport, "Feature report %@ of %@ does not take the value %@.", name,
                   config_.name, payload[1]);
   }
   return true;

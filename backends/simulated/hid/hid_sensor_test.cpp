@@ -16,7 +16,6 @@ namespace {
 
 using namespace std::chrono_literals;
 using ::testing::ElementsAre;
-using ::testing::IsEmpty;
 using ::testing::SizeIs;
 
 class HidSensorTest : public ::testing::Test {
@@ -104,7 +103,7 @@ TEST_F(HidSensorTest, ASensorWithoutSettingsStreamsOnceItIsOpen) {
   make([](HidDeviceConfig& sensor) { sensor.featureReports.clear(); });
   user_->schedule();
   user_->run(50ms);
-  EXPECT_THAT(user_->seen(), IsEmpty());
+  EXPECT_THAT(user_->seen(), testing::IsEmpty());
   ASSERT_TRUE(user_->device->open(nullptr));
   user_->run(55ms);
   EXPECT_THAT(user_->seen(), SizeIs(5));
@@ -125,7 +124,7 @@ TEST_F(HidSensorTest, FeatureReportsAreRefusedAsARealSensorWould) {
       {"a value that it does not take",
        0xAB,
        {0xAB, 2},
-       refusal(HidErrorCode::kRefusedReport, "Feature report 0xAB of sensor does not accept the value 2.")},
+       refusal(HidErrorCode::kRefusedReport, "Feature report 0xAB of sensor does not take the value 2.")},
       {"a report that it does not have",
        0x76,
        {0x76, 1},
@@ -226,7 +225,7 @@ TEST_F(HidSensorTest, ASensorThatIsRemovedSaysSoOnce) {
   EXPECT_EQ(opening(), gone);
   const std::shared_ptr<HidManager> manager = phone_->platform().hid->createManager();
   manager->enumerateDevicesMatching({Dictionary{}});
-  EXPECT_THAT(manager->devices(), IsEmpty());
+  EXPECT_THAT(manager->devices(), testing::IsEmpty());
 }
 
 TEST_F(HidSensorTest, EveryUserGetsEveryReport) {

@@ -17,7 +17,6 @@ namespace quazor {
 namespace {
 
 using namespace std::chrono_literals;
-using ::testing::ElementsAre;
 using ::testing::IsEmpty;
 using ::testing::SizeIs;
 
@@ -68,9 +67,9 @@ TEST_F(SimulatedHidTest, CallsAreObserved) {
   device->setInputReportCallback(nullptr);
   device->unscheduleFromRunLoop(loop, kRunLoopDefaultMode);
   device->close(0);
-  EXPECT_THAT(
-      calls,
-      ElementsAre("RunLoops.currentRunLoop|||+", "HidService.createManager|||+",
+  EXPECT_THAT(calls,
+              testing::ElementsAre(
+                  "RunLoops.currentRunLoop|||+", "HidService.createManager|||+",
                   "HidManager.enumerateDevicesMatching||({PrimaryUsagePage = 65280; PrimaryUsage = 36})|+",
                   "HidManager.devices||1|+", "HidDevice.open|sensor||+", "HidDevice.open|sensor||-",
                   "HidDevice.setInputReportCallback|sensor|receiver|+",

@@ -12,8 +12,6 @@ namespace quazor {
 namespace {
 
 using namespace std::chrono_literals;
-using ::testing::ElementsAre;
-using ::testing::SizeIs;
 
 HidDeviceConfig fastSensor() {
   HidDeviceConfig sensor = testSensor();
@@ -36,7 +34,7 @@ TEST(SimulatedHidOnThreadsTest, ImagesReachTheLoopOfTheThread) {
   const std::vector<std::string> seen = user.seen();
   ASSERT_GE(seen.size(), 3U);
   EXPECT_THAT(std::vector(seen.begin(), seen.begin() + 3),
-              ElementsAre("0x76 frame 1, 792 bytes", "0x76 frame 2, 792 bytes", "0x76 frame 3, 792 bytes"));
+              testing::ElementsAre("0x76 frame 1, 792 bytes", "0x76 frame 2, 792 bytes", "0x76 frame 3, 792 bytes"));
 }
 
 TEST(SimulatedHidOnThreadsTest, NothingComesAfterTheEnd) {
@@ -50,7 +48,7 @@ TEST(SimulatedHidOnThreadsTest, NothingComesAfterTheEnd) {
     user.unschedule();
     const std::size_t count = user.seen().size();
     user.run(2ms);
-    EXPECT_THAT(user.seen(), SizeIs(count));
+    EXPECT_THAT(user.seen(), testing::SizeIs(count));
   }
 }
 
@@ -67,7 +65,7 @@ TEST(SimulatedHidOnThreadsTest, DevicesMayBeDestroyedWhileReportsCome) {
     user.device = nullptr;
     const std::size_t count = user.seen().size();
     user.run(1ms);
-    EXPECT_THAT(user.seen(), SizeIs(count));
+    EXPECT_THAT(user.seen(), testing::SizeIs(count));
   }
 }
 

@@ -1,6 +1,7 @@
 #include "backends/simulated/scenario/scenario_content.h"
 
 #include "base/text/input_error.h"
+#include "tests/support/thrown_text.h"
 
 #include <gmock/gmock.h>
 #include <gtest/gtest.h>
@@ -11,8 +12,6 @@
 namespace quazor {
 namespace {
 
-using ::testing::IsEmpty;
-using ::testing::SizeIs;
 using Json = nlohmann::ordered_json;
 
 // A phone with two sensors, a display and one more entry.
@@ -31,23 +30,18 @@ Scenario read(const std::string& text) {
   return scenarioOf(JsonCursor(document));
 }
 std::string problemOf(const std::string& text) {
-  try {
-    read(text);
-  } catch (const InputError& problem) {
-    return problem.what();
-  }
-  return "nothing";
+  return thrownText<InputError>([&] { read(text); });
 }
 
 TEST(ScenarioContentTest, DevicesAndTheDisplayAreRead) {
   const Scenario scenario = read(withEntry(""));
-  ASSERT_THAT(scenario.hidDevices, SizeIs(2));
+  ASSERT_THAT(scenario.hidDevices, testing::SizeIs(2));
   EXPECT_EQ(scenario.hidDevices[0].name, "near");
   EXPECT_EQ(scenario.hidDevices[1].name, "far");
   EXPECT_EQ(scenario.hidDevices[1].featureReports.at(0).id, 0xAC);
   EXPECT_EQ(scenario.display.properties, (Dictionary{{"Power", 1}, {"Name", "main"}}));
   const Scenario plain = read(R"({"title": "t", "cameras": {}, "groups": {}})");
-  EXPECT_THAT(plain.hidDevices, IsEmpty());
+  EXPECT_THAT(plain.hidDevices, testing::IsEmpty());
   EXPECT_TRUE(plain.display.present);
 }
 
@@ -80,11 +74,7 @@ TEST(ScenarioContentTest, FaultsMayNameDevicesReportsAndProperties) {
 }
 
 TEST(ScenarioContentTest, FaultsThatWouldNeverFireAreRefused) {
-  const struct {
-    const char* name;
-    const char* entries;
-    const char* problem;
-  } kRows[] = {
+  const NamedRefusal kRows[] = {
       {"a device that there is not", R"("operation": "HidDevice.open", "object": "nar")",
        "faults[0].object: \"nar\" is not an object of HidDevice.open; did you mean \"near\"?"},
       {"an operation on no device", R"("operation": "HidService.createManager", "object": "near")",
@@ -99,7 +89,7 @@ TEST(ScenarioContentTest, FaultsThatWouldNeverFireAreRefused) {
       {"a property where there is none", R"("operation": "HidDevice.open", "property": "0xAB")",
        "faults[0].property: HidDevice.open has no property; remove this key."},
   };
-  for (const auto& row : kRows) EXPECT_EQ(problemOf(withFaultEntries(row.entries)), row.problem) << row.name;
+  for (const auto& row : kRows) EXPECT_EQ(problemOf(withFaultEntries(row.text)), row.problem) << row.name;
 }
 
 }  // namespace

@@ -1,6 +1,7 @@
 #include "backends/simulated/scenario/scenario_frames.h"
 
 #include "base/text/input_error.h"
+#include "tests/support/thrown_text.h"
 
 #include <gmock/gmock.h>
 #include <gtest/gtest.h>
@@ -14,7 +15,6 @@ namespace quazor {
 namespace {
 
 using namespace std::chrono_literals;
-using ::testing::ElementsAre;
 using ::testing::SizeIs;
 using Json = nlohmann::ordered_json;
 
@@ -34,14 +34,14 @@ TEST(ScenarioFramesTest, AProjectorIsRead) {
       projector.metadata.overrides,
       (Dictionary{
           {"a", 1}, {"b", -2}, {"c", 1.5}, {"d", true}, {"e", "x"}, {"f", std::uint64_t{18446744073709551615U}}}));
-  EXPECT_THAT(projector.metadata.without, ElementsAre("g"));
+  EXPECT_THAT(projector.metadata.without, testing::ElementsAre("g"));
   ASSERT_THAT(projector.frames, SizeIs(4));
   EXPECT_EQ(projector.frames.at(0).attachment, FrameAttachment::kMissing);
   EXPECT_EQ(projector.frames.at(12).attachment, FrameAttachment::kText);
   EXPECT_EQ(projector.frames.at(13).attachment, FrameAttachment::kNumber);
   EXPECT_EQ(projector.frames.at(14).attachment, FrameAttachment::kDictionary);
   EXPECT_EQ(projector.frames.at(14).overrides, (Dictionary{{"a", 2}}));
-  EXPECT_THAT(projector.frames.at(14).without, ElementsAre("b"));
+  EXPECT_THAT(projector.frames.at(14).without, testing::ElementsAre("b"));
 }
 
 TEST(ScenarioFramesTest, ADeliveryIsRead) {
@@ -129,12 +129,7 @@ TEST(ScenarioFramesTest, WhatIsWrongIsToldInOneSentence) {
   };
   for (const auto& row : kRows) {
     const Json document = Json::parse(row.text);
-    try {
-      row.read(JsonCursor(document));
-      ADD_FAILURE() << row.text << " was read";
-    } catch (const InputError& problem) {
-      EXPECT_STREQ(problem.what(), row.problem) << row.text;
-    }
+    EXPECT_EQ(thrownText<InputError>([&] { row.read(JsonCursor(document)); }), row.problem) << row.text;
   }
 }
 

@@ -2,6 +2,7 @@
 
 #include "base/json/json_document.h"
 #include "base/text/input_error.h"
+#include "tests/support/thrown_text.h"
 
 #include <gmock/gmock.h>
 #include <gtest/gtest.h>
@@ -21,7 +22,6 @@ namespace quazor {
 namespace {
 
 namespace fs = std::filesystem;
-using ::testing::ElementsAre;
 using ::testing::IsEmpty;
 
 // Each test has its own directory.
@@ -44,13 +44,7 @@ class ScenarioReaderTest : public ::testing::Test {
   }
   // The error message for a file, without the directory; "nothing" if the file is valid.
   std::string problemOf(const fs::path& file) {
-    std::string problem;
-    try {
-      readScenario(file);
-      return "nothing";
-    } catch (const InputError& error) {
-      problem = error.what();
-    }
+    std::string problem = thrownText<InputError>([&] { readScenario(file); });
     const std::string folder = folder_.string() + "/";
     for (std::size_t at = problem.find(folder); at != std::string::npos; at = problem.find(folder)) {
       problem.erase(at, folder.size());
@@ -124,7 +118,7 @@ TEST_F(ScenarioReaderTest, ReadsAllThereIsToSay) {
   EXPECT_EQ(camera.firstFrameOffset, 2U);
   EXPECT_EQ(camera.actualFrameRate, 29.97);
   EXPECT_FALSE(camera.deliversFrames);
-  EXPECT_THAT(camera.droppedFrames, ElementsAre(3U, 5U));
+  EXPECT_THAT(camera.droppedFrames, testing::ElementsAre(3U, 5U));
   EXPECT_EQ(camera.dropEvery, 7U);
   EXPECT_FALSE(camera.inSessionStatus);
   Dictionary counters = Camera::defaultErrorCounters();
@@ -136,7 +130,7 @@ TEST_F(ScenarioReaderTest, ReadsAllThereIsToSay) {
 
   ASSERT_EQ(scenario.groups.size(), 2U);
   EXPECT_EQ(scenario.groups[0].id, "y");
-  EXPECT_THAT(scenario.groups[0].cameras, ElementsAre("z", "a"));
+  EXPECT_THAT(scenario.groups[0].cameras, testing::ElementsAre("z", "a"));
   EXPECT_EQ(scenario.groups[0].master, "a");
   EXPECT_FALSE(scenario.groups[0].masterConfiguration);
   EXPECT_TRUE(scenario.groups[1].masterConfiguration);
@@ -181,11 +175,7 @@ TEST_F(ScenarioReaderTest, WhatIsNotSaidIsHealthy) {
 }
 
 TEST_F(ScenarioReaderTest, TextsThatAreNoJsonAreRefusedWithTheirLine) {
-  const struct {
-    const char* name;
-    std::string text;
-    const char* problem;
-  } kRows[] = {
+  const NamedRefusal kRows[] = {
       {"an empty file", "", "p.json:1: not valid JSON: unexpected end of input; expected '[', '{', or a literal."},
       {"a comma too many", "{\n  \"title\": \"t\",\n}",
        "p.json:3: not valid JSON: unexpected '}'; expected string literal."},
@@ -213,11 +203,7 @@ TEST_F(ScenarioReaderTest, EveryLengthOfUtf8Passes) {
 }
 
 TEST_F(ScenarioReaderTest, DocumentsThatMeanNothingAreRefusedWithTheirPath) {
-  const struct {
-    const char* name;
-    std::string text;
-    const char* problem;
-  } kRows[] = {
+  const NamedRefusal kRows[] = {
       {"no object", "[]", "p.json:1: the document: must be an object, not an array."},
       {"no title", R"({"cameras": {}, "groups": {}})", "p.json:1: the document: the key \"title\" is missing."},
       {"an empty title", R"({"title": "", "cameras": {}, "groups": {}})",
@@ -248,11 +234,7 @@ TEST_F(ScenarioReaderTest, DocumentsThatMeanNothingAreRefusedWithTheirPath) {
 }
 
 TEST_F(ScenarioReaderTest, CamerasAndGroupsThatCannotBeAreRefused) {
-  const struct {
-    const char* name;
-    std::string text;
-    const char* problem;
-  } kRows[] = {
+  const NamedRefusal kRows[] = {
       {"an id with a dot", R"({"title": "t", "cameras": {"a.b": {}}, "groups": {}})",
        "p.json:1: cameras.a.b: an id may only contain letters, digits, \"-\" and \"_\"."},
       {"an empty id", R"({"title": "t", "cameras": {"": {}}, "groups": {}})",
@@ -305,11 +287,7 @@ TEST_F(ScenarioReaderTest, CamerasAndGroupsThatCannotBeAreRefused) {
 }
 
 TEST_F(ScenarioReaderTest, FaultsThatWouldNeverFireAreRefused) {
-  const struct {
-    const char* name;
-    std::string text;
-    const char* problem;
-  } kRows[] = {
+  const NamedRefusal kRows[] = {
       {"no list", with(R"("faults": {})"), "p.json:2: faults: must be an array, not an object."},
       {"no operation", withFault(R"("action": "fail")"), "p.json:2: faults[0]: the key \"operation\" is missing."},
       {"an operation that was misspelt", withFault(R"("operation": "CaptureStream.strat", "action": "fail")"),
@@ -398,11 +376,7 @@ TEST_F(ScenarioReaderTest, WhatIsWrongWithABaseIsFoundThere) {
   write("self.json", R"({"base": "./self.json", "title": "t"})");
   write("one.json", R"({"base": "two.json", "title": "t"})");
   write("two.json", R"({"base": "one.json", "title": "t"})");
-  const struct {
-    const char* name;
-    std::string text;
-    const char* problem;
-  } kRows[] = {
+  const NamedRefusal kRows[] = {
       {"a base that there is not", R"({"base": "absent.json"})",
        "p.json:1: base: absent.json: the file does not exist."},
       {"a base that is no name", R"({"base": 1})", "p.json:1: base: must be a non-empty string, not 1."},

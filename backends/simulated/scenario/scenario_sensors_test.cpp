@@ -1,20 +1,18 @@
 #include "backends/simulated/scenario/scenario_sensors.h"
 
 #include "base/text/input_error.h"
+#include "tests/support/thrown_text.h"
 
 #include <gmock/gmock.h>
 #include <gtest/gtest.h>
 
-#include <functional>
 #include <string>
 #include <string_view>
 
 namespace quazor {
 namespace {
 
-using ::testing::ElementsAre;
 using ::testing::IsEmpty;
-using ::testing::SizeIs;
 using Json = nlohmann::ordered_json;
 
 HidDeviceConfig readDevice(std::string_view text) {
@@ -24,15 +22,6 @@ HidDeviceConfig readDevice(std::string_view text) {
 DisplayConfig readDisplayText(std::string_view text) {
   const Json document = Json::parse(text);
   return readDisplay(JsonCursor(document));
-}
-
-std::string problemOf(const std::function<void()>& read) {
-  try {
-    read();
-  } catch (const InputError& problem) {
-    return problem.what();
-  }
-  return "nothing";
 }
 
 TEST(ScenarioSensorsTest, ADeviceIsRead) {
@@ -47,9 +36,9 @@ TEST(ScenarioSensorsTest, ADeviceIsRead) {
   EXPECT_EQ(device.name, "sensor");
   EXPECT_EQ(device.usagePage, 65280);
   EXPECT_EQ(device.usage, 36);
-  ASSERT_THAT(device.featureReports, SizeIs(3));
+  ASSERT_THAT(device.featureReports, testing::SizeIs(3));
   EXPECT_EQ(device.featureReports[0].id, 0xAB);
-  EXPECT_THAT(device.featureReports[0].accepts, ElementsAre(0, 1));
+  EXPECT_THAT(device.featureReports[0].accepts, testing::ElementsAre(0, 1));
   EXPECT_EQ(device.featureReports[0].streamsAt, 1);
   EXPECT_EQ(device.featureReports[1].id, 0x0C);
   EXPECT_THAT(device.featureReports[1].accepts, IsEmpty());
@@ -60,7 +49,7 @@ TEST(ScenarioSensorsTest, ADeviceIsRead) {
   EXPECT_EQ(device.removedAfter, std::nullopt);
   EXPECT_EQ(device.every.reportID, 0x77);
   EXPECT_EQ(device.every.length, 16384U);
-  ASSERT_THAT(device.single, SizeIs(3));
+  ASSERT_THAT(device.single, testing::SizeIs(3));
   EXPECT_EQ(device.single.at(0).reportID, 0);
   EXPECT_EQ(device.single.at(0).length, 1U);
   EXPECT_EQ(device.single.at(12).length, std::nullopt);
@@ -119,11 +108,7 @@ TEST(ScenarioSensorsTest, DevicesThatCannotBeAreRefused) {
   const auto with = [](std::string_view entry) {
     return R"({"usagePage": 1, "usage": 1, )" + std::string(entry) + "}";
   };
-  const struct {
-    const char* name;
-    std::string text;
-    const char* problem;
-  } kRows[] = {
+  const NamedRefusal kRows[] = {
       {"no usage page", R"({"usage": 1})", "the document: the key \"usagePage\" is missing."},
       {"a usage too high", R"({"usagePage": 1, "usage": 65536})",
        "usage: must be an integer from 0 to 65535, not 65536."},
@@ -171,16 +156,12 @@ TEST(ScenarioSensorsTest, DevicesThatCannotBeAreRefused) {
        "images.temperature: must be a number from -1000.0 to 1000.0, not \"hot\"."},
   };
   for (const auto& row : kRows) {
-    EXPECT_EQ(problemOf([&] { readDevice(row.text); }), row.problem) << row.name;
+    EXPECT_EQ(thrownText<InputError>([&] { readDevice(row.text); }), row.problem) << row.name;
   }
 }
 
 TEST(ScenarioSensorsTest, DisplaysThatCannotBeAreRefused) {
-  const struct {
-    const char* name;
-    const char* text;
-    const char* problem;
-  } kRows[] = {
+  const NamedRefusal kRows[] = {
       {"an unknown key", R"({"powered": true})",
        "the document: unknown key \"powered\"; expected one of \"present\", \"registryService\", \"properties\"."},
       {"a presence that is a number", R"({"present": 1})", "present: must be true or false, not 1."},
@@ -189,7 +170,7 @@ TEST(ScenarioSensorsTest, DisplaysThatCannotBeAreRefused) {
        "properties.A[1]: must be a number, a string, true or false, not null."},
   };
   for (const auto& row : kRows) {
-    EXPECT_EQ(problemOf([&] { readDisplayText(row.text); }), row.problem) << row.name;
+    EXPECT_EQ(thrownText<InputError>([&] { readDisplayText(row.text); }), row.problem) << row.name;
   }
 }
 

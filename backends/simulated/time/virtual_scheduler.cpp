@@ -132,7 +132,7 @@ void VirtualScheduler::blockUntil(const std::function<bool()>& condition, std::c
 void VirtualScheduler::stall(std::string_view what) const {
   const double seconds = static_cast<double>(now_.count()) / 1e9;
   throw SimulationStall(
-      formatMessage("The simulated phone waits forever: %@, at %@ s of virtual time.", what, seconds));
+      formatMessage("The simulated phone waits for ever: %@, at %@ s of virtual time.", what, seconds));
 }
 
 void VirtualScheduler::block(const Wait& wait) {

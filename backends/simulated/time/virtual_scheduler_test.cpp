@@ -1,6 +1,7 @@
 #include "backends/simulated/time/virtual_scheduler.h"
 
 #include "backends/simulated/time/simulation_stall.h"
+#include "tests/support/thrown_text.h"
 
 #include <gmock/gmock.h>
 #include <gtest/gtest.h>
@@ -18,11 +19,9 @@ namespace {
 
 using namespace std::chrono_literals;
 using ::testing::ElementsAre;
-using ::testing::HasSubstr;
-using ::testing::UnorderedElementsAre;
 using Words = std::vector<std::string>;
 
-// Follows a list of choices, then always chooses the first; records the number of alternatives.
+// Chooses as told, then always the first; keeps how many things there were to choose from.
 class ScriptedChooser final : public ScheduleStrategy {
  public:
   explicit ScriptedChooser(std::vector<std::size_t> script = {}) : script_(std::move(script)) {}
@@ -147,7 +146,7 @@ TEST_F(VirtualSchedulerTest, ATaskIsDestroyedWhenItHasRunAndBeforeTheNextStarts)
     ~Says() { words.push_back("destroyed"); }
   };
   scheduler_.submit(strand, [this, says = std::make_unique<Says>(Says{words_})] { words_.push_back("runs"); });
-  words_.clear();  // discards the words of the temporary
+  words_.clear();  // of the temporary above
   scheduler_.submit(strand, say("next"));
   scheduler_.blockUntil(1s, "the test");
   EXPECT_THAT(words_, ElementsAre("runs", "destroyed", "next"));
@@ -159,21 +158,17 @@ TEST_F(VirtualSchedulerTest, DroppingWhatIsDelayedLeavesWhatIsDueAndOtherLanes) 
   const auto token = std::make_shared<int>();
   scheduler_.submit(strand, say("due"));
   scheduler_.submitAt(1s, strand, [this, token] { words_.push_back("delayed"); });
-  scheduler_.submitAt(1s, other, say("of another strand"));
+  scheduler_.submitAt(1s, other, say("of another lane"));
   scheduler_.dropDelayed(*strand);
   EXPECT_EQ(token.use_count(), 1);
   scheduler_.blockUntil(2s, "the test");
-  EXPECT_THAT(words_, ElementsAre("due", "of another strand"));
+  EXPECT_THAT(words_, ElementsAre("due", "of another lane"));
 }
 
 TEST_F(VirtualSchedulerTest, AStallSaysWhatWasWaitedForAndWhen) {
   scheduler_.blockUntil(1500ms, "the test");
-  try {
-    scheduler_.blockUntil([] { return false; }, "a lamp is to light up");
-    FAIL() << "the wait returned";
-  } catch (const SimulationStall& stall) {
-    EXPECT_STREQ(stall.what(), "The simulated phone waits forever: a lamp is to light up, at 1.5 s of virtual time.");
-  }
+  EXPECT_EQ(thrownText<SimulationStall>([&] { scheduler_.blockUntil([] { return false; }, "a lamp is to light up"); }),
+            "The simulated phone waits for ever: a lamp is to light up, at 1.5 s of virtual time.");
 }
 
 TEST_F(VirtualSchedulerTest, AWaitEndsWhenALaterTaskMakesItsConditionHold) {
@@ -209,7 +204,7 @@ TEST_F(VirtualSchedulerTest, ATaskIsToldItsLaneAndTheMainFlowHasNone) {
   });
   scheduler_.submitAt(1s, second, tellLane);
   scheduler_.blockUntil(2s, "the test");
-  EXPECT_THAT(strands, UnorderedElementsAre(first, first, second));
+  EXPECT_THAT(strands, testing::UnorderedElementsAre(first, first, second));
   EXPECT_EQ(strands.front(), first);
   EXPECT_EQ(scheduler_.currentStrand(), nullptr);
 }
@@ -236,7 +231,7 @@ TEST_F(VirtualSchedulerTest, DiscardingDestroysPendingTasksAndThoseThatTheyLeave
     }
   };
   auto leaves = std::make_unique<SubmitsWhenDestroyed>(SubmitsWhenDestroyed{scheduler_, strand, token});
-  scheduler_.discardPending();  // discards the task of the temporary
+  scheduler_.discardPending();  // what the temporary left
   scheduler_.submit(strand, [token] {});
   scheduler_.submitAt(1h, strand, [leaves = std::move(leaves)] {});
   EXPECT_EQ(token.use_count(), 3);
@@ -252,12 +247,10 @@ TEST_F(VirtualSchedulerTest, DiscardingUnwindsATaskThatBlocks) {
   };
   scheduler_.submit(strand, [&] {
     const Says says{words_};
-    try {
-      scheduler_.blockUntil([] { return false; }, "a lamp is to light up");
-    } catch (const SimulationStall& stall) {
-      EXPECT_THAT(stall.what(), HasSubstr("a lamp is to light up"));
-      words_.push_back("stalled");
-    }
+    EXPECT_THAT(
+        thrownText<SimulationStall>([&] { scheduler_.blockUntil([] { return false; }, "a lamp is to light up"); }),
+        testing::HasSubstr("a lamp is to light up"));
+    words_.push_back("stalled");
     EXPECT_THROW(scheduler_.blockUntil(1h, "another wait"), SimulationStall);
   });
   scheduler_.blockUntil(1s, "the test");
@@ -294,8 +287,8 @@ TEST(VirtualSchedulerChoices, WithOneThingToDoTheChooserIsNotAsked) {
   EXPECT_TRUE(chooser->counts.empty());
 }
 
-// Two strands with two tasks each, and the main flow waiting for both.
-Words runOfTwoStrands(const std::shared_ptr<ScheduleStrategy>& chooser) {
+// Two lanes of two tasks each, and the main flow that waits for both.
+Words runOfTwoLanes(const std::shared_ptr<ScheduleStrategy>& chooser) {
   VirtualScheduler scheduler(chooser);
   Words words;
   int left = 4;
@@ -320,7 +313,7 @@ TEST(VirtualSchedulerChoices, ReplayingPrefixesOfChoicesReachesEveryInterleaving
     const std::vector<std::size_t> prefix = open.back();
     open.pop_back();
     const auto chooser = std::make_shared<ScriptedChooser>(prefix);
-    reached.insert(runOfTwoStrands(chooser));
+    reached.insert(runOfTwoLanes(chooser));
     ++runs;
     for (std::size_t at = prefix.size(); at < chooser->counts.size(); ++at) {
       for (std::size_t choice = 1; choice < chooser->counts[at]; ++choice) {
@@ -331,7 +324,7 @@ TEST(VirtualSchedulerChoices, ReplayingPrefixesOfChoicesReachesEveryInterleaving
       }
     }
   }
-  EXPECT_EQ(runs, 6);  // the number of ways to merge two sequences of two
+  EXPECT_EQ(runs, 6);  // the ways to merge two sequences of two
   EXPECT_EQ(reached.size(), 6U);
   for (const Words& words : reached) {
     EXPECT_LT(std::ranges::find(words, "a1"), std::ranges::find(words, "a2"));
@@ -342,8 +335,8 @@ TEST(VirtualSchedulerChoices, ReplayingPrefixesOfChoicesReachesEveryInterleaving
 TEST(VirtualSchedulerChoices, OneSeedIsOneOrderAndSeedsDiffer) {
   std::set<Words> reached;
   for (std::uint64_t seed = 0; seed < 64; ++seed) {
-    const Words words = runOfTwoStrands(std::make_shared<RandomStrategy>(seed));
-    EXPECT_EQ(words, runOfTwoStrands(std::make_shared<RandomStrategy>(seed)));
+    const Words words = runOfTwoLanes(std::make_shared<RandomStrategy>(seed));
+    EXPECT_EQ(words, runOfTwoLanes(std::make_shared<RandomStrategy>(seed)));
     reached.insert(words);
   }
   EXPECT_EQ(reached.size(), 6U);

@@ -2,9 +2,12 @@
 #pragma once
 
 #include "contract/diagnostic_contract.h"
+#include "contract/lab.h"
 #include "platform/platform.h"
 
 #include <memory>
+#include <string>
+#include <string_view>
 
 namespace quazor::fake {
 
@@ -65,5 +68,14 @@ class FakeAnalysis : public QZAnalysis, public QZAnalysisSetup {
   Behaviour behaviour_ = Behaviour::kNormal;
   double minimum_ = 0;
 };
+
+// Registers the diagnostic NAME of an experiment NAMEExperiment and an analysis NAMEAnalysis.
+template <class Experiment>
+void registerDiagnostic(const std::string& name, std::string_view summary) {
+  QZLab& lab = QZLab::defaultLab();
+  lab.addExperimentWithName(name + "Experiment", [] { return std::make_shared<Experiment>(); });
+  lab.addAnalysisWithName(name + "Analysis", [] { return std::make_shared<FakeAnalysis>(); });
+  lab.addDiagnosticWithName(name, summary, name + "Experiment", name + "Analysis");
+}
 
 }  // namespace quazor::fake

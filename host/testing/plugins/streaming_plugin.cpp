@@ -1,5 +1,4 @@
 // A plug-in for tests of the host: its diagnostic takes frames from the phone's first camera.
-#include "contract/lab.h"
 #include "host/testing/plugins/fake_diagnostic.h"
 #include "platform/capture_keys.h"
 #include "platform/pixel_buffer.h"
@@ -57,12 +56,7 @@ class StreamingExperiment final : public QZExperiment {
   std::uint64_t wanted_ = 0;
 };
 
-[[gnu::constructor]] void registerStreaming() {
-  QZLab& lab = QZLab::defaultLab();
-  lab.addExperimentWithName("StreamingExperiment", [] { return std::make_shared<StreamingExperiment>(); });
-  lab.addAnalysisWithName("StreamingAnalysis", [] { return std::make_shared<FakeAnalysis>(); });
-  lab.addDiagnosticWithName("Streaming", "Takes frames.", "StreamingExperiment", "StreamingAnalysis");
-}
+[[gnu::constructor]] void registerStreaming() { registerDiagnostic<StreamingExperiment>("Streaming", "Takes frames."); }
 
 }  // namespace
 

@@ -1,5 +1,4 @@
 // A plug-in for tests of the host: asking its diagnostic for a description ends the process.
-#include "contract/lab.h"
 #include "host/testing/plugins/fake_diagnostic.h"
 
 #include <unistd.h>
@@ -15,12 +14,7 @@ class FatalDescription final : public FakeExperiment {
   QZDescription experimentDescription() const override { ::_exit(4); }
 };
 
-[[gnu::constructor]] void registerFatal() {
-  QZLab& lab = QZLab::defaultLab();
-  lab.addAnalysisWithName("FatalAnalysis", [] { return std::make_shared<FakeAnalysis>(); });
-  lab.addExperimentWithName("FatalExperiment", [] { return std::make_shared<FatalDescription>(); });
-  lab.addDiagnosticWithName("Fatal", "Cannot be described.", "FatalExperiment", "FatalAnalysis");
-}
+[[gnu::constructor]] void registerFatal() { registerDiagnostic<FatalDescription>("Fatal", "Cannot be described."); }
 
 }  // namespace
 

@@ -1,5 +1,4 @@
 // A plug-in for tests of the host: diagnostics that do not go by the rules, each in its own way.
-#include "contract/lab.h"
 #include "contract/log_channel.h"
 #include "host/testing/plugins/fake_diagnostic.h"
 
@@ -87,12 +86,7 @@ class UnrulyExperiment final : public FakeExperiment {
   int way_ = 0;
 };
 
-[[gnu::constructor]] void registerUnruly() {
-  QZLab& lab = QZLab::defaultLab();
-  lab.addAnalysisWithName("UnrulyAnalysis", [] { return std::make_shared<FakeAnalysis>(); });
-  lab.addExperimentWithName("UnrulyExperiment", [] { return std::make_shared<UnrulyExperiment>(); });
-  lab.addDiagnosticWithName("Unruly", "Goes its own way.", "UnrulyExperiment", "UnrulyAnalysis");
-}
+[[gnu::constructor]] void registerUnruly() { registerDiagnostic<UnrulyExperiment>("Unruly", "Goes its own way."); }
 
 }  // namespace
 
