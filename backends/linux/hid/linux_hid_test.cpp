@@ -22,7 +22,6 @@ namespace {
 using namespace std::chrono_literals;
 using ::testing::ElementsAre;
 using ::testing::IsEmpty;
-using ::testing::SizeIs;
 
 Dictionary matchingUsage(Value page, Value usage) {
   return {{std::string(kHidPrimaryUsagePage), std::move(page)}, {std::string(kHidPrimaryUsage), std::move(usage)}};
@@ -96,7 +95,7 @@ TEST_F(LinuxHidTest, OnlyTheFirstTopLevelCollectionIsMatched) {
   both.insert(both.end(), second.begin(), second.end());
   tree_.connect("hidraw0", both);
   EXPECT_THAT(find({matchingUsage(0xFF00, 0x24)}), IsEmpty());
-  EXPECT_THAT(find({matchingUsage(0xFF00, 0x30)}), SizeIs(1));
+  EXPECT_THAT(find({matchingUsage(0xFF00, 0x30)}), testing::SizeIs(1));
 }
 
 TEST_F(LinuxHidTest, AManagerTellsWhatItsLastEnumerationFound) {
@@ -105,7 +104,7 @@ TEST_F(LinuxHidTest, AManagerTellsWhatItsLastEnumerationFound) {
   EXPECT_EQ(made->description(), "HID manager of " + tree_.roots().devices.string() + "/hidraw*");
   EXPECT_THAT(made->devices(), IsEmpty());
   made->enumerateDevicesMatching({Dictionary{}});
-  EXPECT_THAT(made->devices(), SizeIs(1));
+  EXPECT_THAT(made->devices(), testing::SizeIs(1));
   EXPECT_EQ(made->devices(), made->devices());
   EXPECT_EQ(made->devices().front()->description(),
             "HID device " + tree_.path("hidraw0").string() + " \"Test Sensor\"");
@@ -177,7 +176,7 @@ TEST_F(LinuxHidTest, ASignalIsNotTakenForTheAnswerToAFeatureReport) {
   ASSERT_TRUE(device->open(nullptr));
   calls_->featureInterruptions = 2;
   EXPECT_TRUE(device->setFeatureReportWithID(0xAB, Bytes{0xAB, 1}, nullptr));
-  EXPECT_THAT(calls_->features, SizeIs(3));
+  EXPECT_THAT(calls_->features, testing::SizeIs(3));
   calls_->featureInterruptions = 1;
   calls_->featureError = EIO;
   calls_->featureTime = 2600ms;
@@ -200,7 +199,7 @@ TEST_F(LinuxHidTest, FeatureReportsReachTheDeviceWhole) {
   EXPECT_EQ(errorOfFeature(*device, 0xAB, {0xAC, 1}), refusal);
   EXPECT_EQ(errorOfFeature(*device, 0xAB, Bytes(16384, 0xAB)), refusal);
   EXPECT_TRUE(device->setFeatureReportWithID(0xAB, Bytes(16383, 0xAB), nullptr));
-  EXPECT_THAT(calls_->features, SizeIs(3));
+  EXPECT_THAT(calls_->features, testing::SizeIs(3));
   device->close(0);
   EXPECT_EQ(errorOfFeature(*device, 0xAB, {0xAB, 1}), "LinuxErrorDomain code 7: /dev/hidraw0 is not open.");
 }
