@@ -8,7 +8,7 @@ build_root=${QUAZOR_BUILD_DIR:-$root/build}
 # install_packages PACKAGE...: installs missing packages on Debian and derivatives, after printing their names.
 install_packages() {
   if ! command -v dpkg-query >/dev/null 2>&1 || ! command -v apt-get >/dev/null 2>&1; then
-    say "This is not a Debian system: if the build fails, install what these Debian packages hold: $*"
+    say "This is not a Debian system: if the build fails, install the equivalents of these Debian packages: $*"
     return 0
   fi
   local missing=() package
@@ -29,7 +29,7 @@ install_packages() {
        >"$log" 2>&1; then
     cat "$log" >&2
     rm -f "$log"
-    say "The packages could not be installed; the lines above say why."
+    say "The packages could not be installed; see the messages above."
     return 1
   fi
   rm -f "$log"
@@ -40,7 +40,7 @@ check_cmake() {
   local needed=3.25 found
   found=$(cmake --version 2>/dev/null | sed -n '1s/.*version \([0-9.]*\).*/\1/p') || true
   if [ -z "$found" ]; then
-    say "There is no cmake. Install CMake $needed or newer; Debian 12 has it in the package cmake."
+    say "CMake is not installed. Install CMake $needed or newer; Debian 12 has it in the package cmake."
     return 1
   fi
   if [ "$(printf '%s\n' "$needed" "$found" | sort -V | head -n 1)" != "$needed" ]; then
@@ -51,20 +51,20 @@ check_cmake() {
 
 # claim_build_folder DIRECTORY: creates a build directory, or prints why it cannot and what to do.
 claim_build_folder() {
-  local directory=$1 elsewhere="Build elsewhere: QUAZOR_BUILD_DIR=/some/folder $0"
+  local directory=$1 elsewhere="To build elsewhere: QUAZOR_BUILD_DIR=/some/directory $0"
   if ! mkdir -p "$directory" 2>/dev/null; then
-    say "The folder $directory cannot be made: the checkout is read-only, or belongs to somebody else. $elsewhere"
+    say "The directory $directory cannot be created: the checkout is read-only or belongs to another user. $elsewhere"
     return 1
   fi
   if [ ! -w "$directory" ] || { [ -e "$directory/build.ninja" ] && [ ! -w "$directory/build.ninja" ]; }; then
-    say "The build in $directory belongs to $(stat -c %U "$directory"), and you may not write there. $elsewhere"
+    say "The build in $directory belongs to $(stat -c %U "$directory") and is not writable. $elsewhere"
     return 1
   fi
   # CMake rejects a build directory that was configured for another source directory, for example after a move.
   local configured_for
   configured_for=$(sed -n 's/^CMAKE_HOME_DIRECTORY:INTERNAL=//p' "$directory/CMakeCache.txt" 2>/dev/null) || true
   if [ -n "$configured_for" ] && [ "$configured_for" != "$root" ]; then
-    say "The build in $directory was made for $configured_for; it is made again for $root."
+    say "The build in $directory was configured for $configured_for; it is rebuilt for $root."
     find "$directory" -mindepth 1 -delete
   fi
 }
@@ -99,12 +99,12 @@ build() {
   local log lock
   exec {lock}>"$directory/.building"
   if ! flock --nonblock "$lock"; then
-    say "Another build is at work in $directory; waiting for it."
+    say "Another build is running in $directory; waiting for it."
     flock "$lock"
   fi
   log=$(mktemp)
   if [ ! -f "$directory/build.ninja" ]; then
-    say "Building in ${directory#"$root"/} (once; this takes some minutes)"
+    say "Building in ${directory#"$root"/} (first build; this takes some minutes)"
     if ! cmake -S "$root" -B "$directory" -G Ninja "$@" >"$log" 2>&1; then
       cat "$log" >&2
       rm -f "$log" "$directory/build.ninja"
