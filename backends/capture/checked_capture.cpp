@@ -112,8 +112,7 @@ bool ClientDevice::releaseAll(const CaptureStreams& streams, const Refuser& refu
     CameraSlot* const camera = cameraOf(stream, refuse);
     if (camera == nullptr || !client_->checkControl(*camera, refuse)) return false;
     if (camera->phase != StreamPhase::kStopped) {
-      return refuse(CaptureRefusal::kWrongState, "%@ is running; stop it before giving it back.",
-                    camera->info().name);
+      return refuse(CaptureRefusal::kWrongState, "%@ is running; stop it before giving it back.", camera->info().name);
     }
     if (std::ranges::find(given, camera) == given.end()) given.push_back(camera);
   }

@@ -222,8 +222,8 @@ class Run {
     std::string refusal;
     for (std::size_t i = selected_.size(); i > 0; --i) {
       if (runs_[selected_[i - 1]]) {
-        refusal = "SimulatedCaptureErrorDomain code 10: " + camera(i - 1).id +
-                  " is running; stop it before giving it back.";
+        refusal =
+            "SimulatedCaptureErrorDomain code 10: " + camera(i - 1).id + " is running; stop it before giving it back.";
       }
     }
     return call("device relinquish control " + selectedIds(), refusal);
