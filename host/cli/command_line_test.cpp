@@ -108,7 +108,7 @@ TEST(ParseCommandLine, ReadsEveryOption) {
   EXPECT_TRUE(options->realTime);
   EXPECT_EQ(options->seed, UINT64_MAX);
   ASSERT_EQ(options->settings.size(), 2U);
-  EXPECT_EQ(options->settings[1].half, Part::kAnalysis);
+  EXPECT_EQ(options->settings[1].part, Part::kAnalysis);
   EXPECT_EQ(options->logLevel, LogLevel::kDebug);
   EXPECT_TRUE(options->systemLog);
   EXPECT_EQ(options->report.shownLog, LogLevel::kDebug);
