@@ -181,7 +181,7 @@ TEST_F(LinuxHidTest, ASignalIsNotTakenForTheAnswerToAFeatureReport) {
   calls_->featureInterruptions = 1;
   calls_->featureError = EIO;
   calls_->featureTime = 2600ms;
-  EXPECT_THAT(errorOfFeature(*device, 0xAB, {0xAB, 1}), ::testing::HasSubstr("failed: the device did not answer"));
+  EXPECT_THAT(errorOfFeature(*device, 0xAB, {0xAB, 1}), ::testing::HasSubstr("failed: the device did not respond"));
 }
 
 TEST_F(LinuxHidTest, FeatureReportsReachTheDeviceWhole) {
