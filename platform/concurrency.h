@@ -51,7 +51,7 @@ class QUAZOR_EXPORT Semaphore {
 // How soon a queue's tasks should run when the machine is busy.
 enum class QualityOfService { kUserInteractive, kDefault, kBackground };
 
-// Makes queues and semaphores. What it made may outlive it.
+// Creates queues and semaphores, which may outlive it.
 // Thread: any.
 class QUAZOR_EXPORT Concurrency {
  public:
