@@ -1,10 +1,10 @@
 // What the experiment hands to the capture service, to the kind of a number and to the object.
-#include "tests/support/fake_capture.h"
+#include "diagnostics/camera_sync/camera_sync_for_tests.h"
 
 namespace quazor {
 namespace {
 
-using CameraSyncExperimentCalls = FakeCaptureTest;
+using CameraSyncExperimentCalls = ScriptedCameraSyncTest;
 
 // A slave's configuration; the ratio is an integer, signed or not.
 void expectSlaveConfiguration(const Value* configuration, const std::string& whose) {

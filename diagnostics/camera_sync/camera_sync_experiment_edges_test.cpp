@@ -1,5 +1,5 @@
 // The experiment on capture services that answer what no healthy phone would.
-#include "tests/support/fake_capture.h"
+#include "diagnostics/camera_sync/camera_sync_for_tests.h"
 
 #include <cstdint>
 #include <limits>
@@ -7,7 +7,7 @@
 namespace quazor {
 namespace {
 
-using CameraSyncExperimentEdges = FakeCaptureTest;
+using CameraSyncExperimentEdges = ScriptedCameraSyncTest;
 
 // What the wide camera's session entry is logged as, when it is the master.
 std::string reportLine(std::string_view offset, std::string_view frames, std::string_view total) {

@@ -1,7 +1,7 @@
 // Whole runs, call by call: the healthy one, and one for every step that can fail.
 #include "contract/message_format.h"
 #include "diagnostics/sensor_images/nimbe_image_experiment.h"
-#include "tests/support/hand_made_sensor.h"
+#include "tests/support/fake_sensor.h"
 #include "tests/support/run_transcript.h"
 
 #include <gtest/gtest.h>
@@ -44,7 +44,7 @@ void replaceAll(std::string& text, std::string_view what, std::string_view with)
 // A run with two images within three seconds.
 class NimbeImageRun : public testing::Test {
  protected:
-  using Change = std::function<void(HandMadeSensor& sensor)>;
+  using Change = std::function<void(FakeSensor& sensor)>;
 
   // Everything that a run does and returns is `trace`, in which "@1" stands for the first image and so on; with an
   // error of the device's own and without, with a place for an error and without.
@@ -66,8 +66,8 @@ class NimbeImageRun : public testing::Test {
  private:
   static std::string run(const Change& change, bool hasOwnError, ErrorPlace place, bool hasStream) {
     RunTranscript transcript;
-    HandMadeSensor sensor([&](std::string_view operation, std::string_view object, std::string_view detail,
-                              bool succeeded) { transcript.addCall(operation, object, detail, succeeded); });
+    FakeSensor sensor([&](std::string_view operation, std::string_view object, std::string_view detail,
+                          bool succeeded) { transcript.addCall(operation, object, detail, succeeded); });
     if (hasOwnError) sensor.device->ownError = makeError("BenchErrorDomain", 7, "Broken.");
     change(sensor);
     const auto experiment = hasStream ? std::make_shared<QZNimbeImageExperiment>(sensor.platform())
@@ -81,11 +81,11 @@ class NimbeImageRun : public testing::Test {
   }
 };
 
-void sendAt(HandMadeSensor& sensor, int time, std::uint8_t reportID, const Bytes& report) {
+void sendAt(FakeSensor& sensor, int time, std::uint8_t reportID, const Bytes& report) {
   sensor.loop.at(milliseconds(time), [&sensor, reportID, report] { sensor.device->send(reportID, report); });
 }
 
-void failAt(HandMadeSensor& sensor, int time) {
+void failAt(FakeSensor& sensor, int time) {
   sensor.loop.at(milliseconds(time),
                  [&sensor] { sensor.device->sendError(makeError("HidErrorDomain", -536, "The device is gone.")); });
 }
@@ -115,7 +115,7 @@ returned a result
 error untouched
 images = (@2, @1)
 )",
-            [](HandMadeSensor& sensor) {
+            [](FakeSensor& sensor) {
               sendAt(sensor, 33, 0x76, imageReport(2));
               sendAt(sensor, 66, 0x76, imageReport(1));
               sendAt(sensor, 99, 0x76, imageReport(3));
@@ -129,7 +129,7 @@ returned a result
 error untouched
 images = (@1, @2, @3)
 )",
-            [](HandMadeSensor& sensor) {
+            [](FakeSensor& sensor) {
               sendAt(sensor, 33, 0x76, imageReport(1));
               sendAt(sensor, 66, 0x76, imageReport(2));
               sendAt(sensor, 66, 0x76, imageReport(3));
@@ -143,7 +143,7 @@ returned a result
 error untouched
 images = (@1, @2)
 )",
-            [](HandMadeSensor& sensor) {
+            [](FakeSensor& sensor) {
               sendAt(sensor, 1, 0x75, imageReport(3));
               sendAt(sensor, 2, 0x76, Bytes(791));
               sendAt(sensor, 3, 0x76, imageReport(1));
@@ -156,7 +156,7 @@ TEST_F(NimbeImageRun, FailsWithoutAStream) {
   expectRun(R"(returned nothing
 error QZNimbeImageExperimentErrorDomain code 3: Failed to create nimbe stream.
 )",
-            [](HandMadeSensor&) {}, false);
+            [](FakeSensor&) {}, false);
 }
 
 TEST_F(NimbeImageRun, FailsWithoutADevice) {
@@ -166,7 +166,7 @@ manager devices 0
 returned nothing
 error QZNimbeImageExperimentErrorDomain code 3: Nimbe device match was ambiguous!
 )",
-            [](HandMadeSensor& sensor) { sensor.matchingDevices.clear(); });
+            [](FakeSensor& sensor) { sensor.matchingDevices.clear(); });
 }
 
 TEST_F(NimbeImageRun, FailsWithTwoDevices) {
@@ -176,7 +176,7 @@ manager devices 2
 returned nothing
 error QZNimbeImageExperimentErrorDomain code 3: Nimbe device match was ambiguous!
 )",
-            [](HandMadeSensor& sensor) { sensor.matchingDevices.push_back(sensor.device); });
+            [](FakeSensor& sensor) { sensor.matchingDevices.push_back(sensor.device); });
 }
 
 TEST_F(NimbeImageRun, FailsWhenTheDeviceDoesNotOpen) {
@@ -184,7 +184,7 @@ TEST_F(NimbeImageRun, FailsWhenTheDeviceDoesNotOpen) {
 returned nothing
 error QZNimbeImageExperimentErrorDomain code 3: Could not open Nimbe device.)" +
                 std::string(kCause) + "\n",
-            [](HandMadeSensor& sensor) { sensor.device->opens = false; });
+            [](FakeSensor& sensor) { sensor.device->opens = false; });
 }
 
 TEST_F(NimbeImageRun, FailsWhenThePowerModeIsRefused) {
@@ -194,7 +194,7 @@ sensor setFeatureReport 171 = ab01 -> failed
 returned nothing
 error QZNimbeImageExperimentErrorDomain code 4: Failed to override power mode to active!)" +
                 std::string(kCause) + "\n",
-            [](HandMadeSensor& sensor) { sensor.device->refusedReports = {0xAB}; });
+            [](FakeSensor& sensor) { sensor.device->refusedReports = {0xAB}; });
 }
 
 TEST_F(NimbeImageRun, FailsWhenTheStreamingModeIsRefused) {
@@ -205,7 +205,7 @@ sensor setFeatureReport 172 = ac01 -> failed
 returned nothing
 error QZNimbeImageExperimentErrorDomain code 5: Failed to set streaming mode to images only!)" +
                 std::string(kCause) + "\n",
-            [](HandMadeSensor& sensor) { sensor.device->refusedReports = {0xAC}; });
+            [](FakeSensor& sensor) { sensor.device->refusedReports = {0xAC}; });
 }
 
 TEST_F(NimbeImageRun, FailsWhenTheTimeIsUpAndDropsItsImages) {
@@ -214,7 +214,7 @@ loop removeObserver common
 returned nothing
 error QZNimbeImageExperimentErrorDomain code 6: Timed out after 3 seconds.
 )",
-            [](HandMadeSensor& sensor) {
+            [](FakeSensor& sensor) {
               sendAt(sensor, 33, 0x76, imageReport(1));
               sendAt(sensor, 3001, 0x76, imageReport(2));
             });
@@ -226,7 +226,7 @@ loop removeObserver common
 returned nothing
 error HidErrorDomain code -536: The device is gone.
 )",
-            [](HandMadeSensor& sensor) {
+            [](FakeSensor& sensor) {
               sendAt(sensor, 33, 0x76, imageReport(1));
               failAt(sensor, 50);
             });
@@ -238,7 +238,7 @@ loop removeObserver common
 returned nothing
 error HidErrorDomain code -536: The device is gone.
 )",
-            [](HandMadeSensor& sensor) {
+            [](FakeSensor& sensor) {
               sendAt(sensor, 33, 0x76, imageReport(1));
               sendAt(sensor, 66, 0x76, imageReport(2));
               failAt(sensor, 66);
@@ -252,7 +252,7 @@ loop removeObserver common
 returned nothing
 error QZNimbeImageExperimentErrorDomain code 6: Timed out after 3 seconds.
 )",
-            [](HandMadeSensor& sensor) { failAt(sensor, 3000); });
+            [](FakeSensor& sensor) { failAt(sensor, 3000); });
 }
 
 TEST_F(NimbeImageRun, ReturnsWhatItHasWhenTheDeviceHasLeftTheLoop) {
@@ -262,7 +262,7 @@ returned a result
 error untouched
 images = (@1)
 )",
-            [](HandMadeSensor& sensor) {
+            [](FakeSensor& sensor) {
               sendAt(sensor, 33, 0x76, imageReport(1));
               sensor.loop.at(milliseconds(40),
                              [&sensor] { sensor.device->unscheduleFromRunLoop(sensor.loop, kRunLoopDefaultMode); });
@@ -276,7 +276,7 @@ returned a result
 error untouched
 images = ()
 )",
-            [](HandMadeSensor& sensor) {
+            [](FakeSensor& sensor) {
               sensor.loop.at(milliseconds(0),
                              [&sensor] { sensor.device->unscheduleFromRunLoop(sensor.loop, kRunLoopDefaultMode); });
             });
@@ -284,8 +284,9 @@ images = ()
 
 TEST_F(NimbeImageRun, LetsTheExceptionOfAMissingHidManagerThrough) {
   RunTranscript transcript;
-  HandMadeSensor sensor([&](std::string_view operation, std::string_view object, std::string_view detail,
-                            bool succeeded) { transcript.addCall(operation, object, detail, succeeded); });
+  FakeSensor sensor([&](std::string_view operation, std::string_view object, std::string_view detail, bool succeeded) {
+    transcript.addCall(operation, object, detail, succeeded);
+  });
   sensor.hasHidManager = false;
   const auto experiment = std::make_shared<QZNimbeImageExperiment>(sensor.platform());
   ASSERT_TRUE(experiment->setupWithParameters({{"images", 1}, {"timeout", 1}}, nullptr, nullptr));

@@ -1,4 +1,4 @@
-// A made-up video driver, and a machine that has its nodes, for the tests of the capture service.
+// A fake video driver, and a machine that has its nodes, for the tests of the capture service.
 //
 // It does what real drivers were seen to do: takes a frame rate that it does not have and silently gives another, keeps
 // a queue busy until every buffer is unmapped, gives fewer buffers than were asked for, stamps frames in the future.

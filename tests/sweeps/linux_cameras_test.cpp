@@ -1,9 +1,9 @@
-// The plug-in's camera experiments over the capture service on V4L2 and a made-up video driver.
+// The plug-in's camera experiments over the capture service on V4L2 and a fake video driver.
 #include "backends/linux/capture/linux_capture_for_tests.h"
 #include "backends/threads/thread_concurrency.h"
 #include "diagnostics/camera_sync/camera_sync_experiment.h"
 #include "diagnostics/projector_fault/tessel_fault_experiment.h"
-#include "tests/support/hand_made_camera.h"
+#include "tests/support/fake_camera.h"
 
 #include <atomic>
 #include <cerrno>
@@ -15,7 +15,7 @@ namespace {
 using Fake = FakeCameras;
 using namespace std::chrono_literals;
 
-// Whoever sleeps lets the made-up cameras' time pass; `during` happens in the middle.
+// Whoever sleeps lets the fake cameras' time pass; `during` happens in the middle.
 class FakeClock final : public Clock {
  public:
   explicit FakeClock(std::shared_ptr<FakeV4l2Api> kernel) : kernel_(std::move(kernel)) {}
@@ -219,7 +219,7 @@ class ProjectorFaultOnLinuxTest : public testing::Test {
     platform.capture = fake_.capture;
     platform.clock = std::make_shared<FakeClock>(fake_.kernel);
     platform.concurrency = std::make_shared<ThreadConcurrency>();
-    platform.reports = std::make_shared<HandMadeReports>(handMadeChannels(1), 0);
+    platform.reports = std::make_shared<FakeReports>(fakeChannels(1), 0);
     const auto experiment = std::make_shared<QZTesselFaultExperiment>(std::move(platform));
     std::atomic<bool> ended = false;
     const std::uint64_t begin = fake_.capture->framesDelivered();

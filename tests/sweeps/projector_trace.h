@@ -1,9 +1,9 @@
-// What happened in a run of the projector fault experiment on the hand-made camera, and whether it was right.
+// What happened in a run of the projector fault experiment on the fake camera, and whether it was right.
 #pragma once
 
 #include "contract/diagnostic_contract.h"
 #include "contract/value.h"
-#include "tests/support/hand_made_camera.h"
+#include "tests/support/fake_camera.h"
 
 #include <chrono>
 #include <cstddef>

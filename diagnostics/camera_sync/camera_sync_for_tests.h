@@ -1,4 +1,4 @@
-// A scripted capture service for camera synchronisation, whose calls a transcript holds.
+// Camera synchronisation on a scripted capture service, whose calls a transcript holds.
 #pragma once
 
 #include "diagnostics/camera_sync/camera_sync_experiment.h"
@@ -56,9 +56,9 @@ inline Value statusEntry(Value offset, Value frames) {
 }
 
 // A device with one group of the three back cameras, the wide one its master; a test changes what it is about.
-class FakeCaptureTest : public testing::Test {
+class ScriptedCameraSyncTest : public testing::Test {
  protected:
-  FakeCaptureTest() {
+  ScriptedCameraSyncTest() {
     device->groups = {group};
     setStatus(kWidePort, statusEntry(0, 60));
     setStatus(kTelePort, statusEntry(1, 59));

@@ -1,4 +1,4 @@
-// A display, its sensor and a run loop made by hand: a test says what is there, what is refused and what comes when.
+// A fake display, its sensor and a run loop: a test says what is there, what is refused and what comes when.
 #pragma once
 
 #include "platform/platform.h"
@@ -24,9 +24,9 @@ using CallRecorder =
     std::function<void(std::string_view operation, std::string_view object, std::string_view detail, bool succeeded)>;
 
 // A loop with a time of its own, which passes only while the loop waits. What it waits for is told to it beforehand.
-class HandMadeRunLoop final : public RunLoop {
+class FakeRunLoop final : public RunLoop {
  public:
-  explicit HandMadeRunLoop(CallRecorder record) : record_(std::move(record)) {}
+  explicit FakeRunLoop(CallRecorder record) : record_(std::move(record)) {}
 
   // Does something when the loop waits at that time or later; equal times in the order of the calls.
   void at(std::chrono::nanoseconds time, std::function<void()> action) { actions_.emplace(time, std::move(action)); }
@@ -69,9 +69,9 @@ class HandMadeRunLoop final : public RunLoop {
 };
 
 // A device that takes everything but what it is told to refuse.
-class HandMadeHidDevice final : public HidDevice {
+class FakeHidDevice final : public HidDevice {
  public:
-  explicit HandMadeHidDevice(CallRecorder record) : record_(std::move(record)) {}
+  explicit FakeHidDevice(CallRecorder record) : record_(std::move(record)) {}
 
   // Before it is used: what it answers.
   bool opens = true;
@@ -124,9 +124,9 @@ class HandMadeHidDevice final : public HidDevice {
 };
 
 // All the services that the sensor image experiment uses. What is changed here counts for the calls after it.
-class HandMadeSensor {
+class FakeSensor {
  public:
-  explicit HandMadeSensor(CallRecorder record);
+  explicit FakeSensor(CallRecorder record);
 
   // Its services borrow the sensor, which must outlive them.
   Platform platform();
@@ -136,8 +136,8 @@ class HandMadeSensor {
   std::optional<Value> displayProperty;  // "DSPLY Debug Info"; at first that of a powered display
   bool hasHidManager = true;
   bool hasRunLoop = true;
-  HandMadeRunLoop loop;
-  std::shared_ptr<HandMadeHidDevice> device;
+  FakeRunLoop loop;
+  std::shared_ptr<FakeHidDevice> device;
   std::vector<std::shared_ptr<HidDevice>> matchingDevices;  // at first the one device
   std::vector<Dictionary> matching;                         // what was last looked for
 

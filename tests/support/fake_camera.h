@@ -1,4 +1,4 @@
-// A depth camera and its report channels made by hand: a test pushes every frame itself.
+// A fake depth camera and its report channels: a test pushes every frame itself.
 #pragma once
 
 #include "platform/capture_service.h"
@@ -38,9 +38,9 @@ inline constexpr std::array kFrameKinds{FrameKind::kLit,
 std::string_view nameOf(FrameKind kind);
 
 // A buffer that belongs to whoever made it and counts the references that others take. Any thread.
-class HandMadeBuffer final : public PixelBuffer {
+class FakePixelBuffer final : public PixelBuffer {
  public:
-  explicit HandMadeBuffer(FrameKind kind = FrameKind::kLit) : kind_(kind) {}
+  explicit FakePixelBuffer(FrameKind kind = FrameKind::kLit) : kind_(kind) {}
 
   void retain() override { references_.fetch_add(1); }
   void release() override { references_.fetch_sub(1); }
@@ -60,9 +60,9 @@ class HandMadeBuffer final : public PixelBuffer {
 };
 
 // The stream of the front infrared camera. It takes every property, and frames and events from its test.
-class HandMadeStream final : public CaptureStream {
+class FakeStream final : public CaptureStream {
  public:
-  HandMadeStream();
+  FakeStream();
 
   // Before the stream is used: what it answers.
   bool stops = true;  // a stop that is refused leaves the stream running
@@ -97,18 +97,18 @@ class HandMadeStream final : public CaptureStream {
   int handlers_ = 0;      // that are running; guarded by mutex_
 };
 
-// The error counters that a HandMadeStream answers unless told otherwise: all six, from I2C 1 to projector 6.
-const Dictionary& handMadeErrorCounters();
+// The error counters that a FakeStream answers unless told otherwise: all six, from I2C 1 to projector 6.
+const Dictionary& fakeErrorCounters();
 
 // A capture service, plug-in and device with the one stream.
-std::shared_ptr<CaptureService> makeHandMadeCapture(std::shared_ptr<HandMadeStream> stream);
+std::shared_ptr<CaptureService> makeFakeCapture(std::shared_ptr<FakeStream> stream);
 
 // Report channels whose every counter goes up by `growth` from one snapshot to the next. Any thread.
-class HandMadeReports final : public ReportFacility {
+class FakeReports final : public ReportFacility {
  public:
   using Descriptions = std::vector<std::shared_ptr<const ReportChannelDescription>>;
 
-  HandMadeReports(Descriptions channels, std::uint64_t growth)
+  FakeReports(Descriptions channels, std::uint64_t growth)
       : channels_(std::make_shared<const Descriptions>(std::move(channels))), growth_(growth) {}
 
   std::shared_ptr<const ReportChannelSet> reportWithOnlySimpleChannels(DiagnosticErrorPtr* error) override;
@@ -119,6 +119,6 @@ class HandMadeReports final : public ReportFacility {
 };
 
 // `count` channels "Channel 0", "Channel 1" and so on of the fault report, each followed by one of another subgroup.
-HandMadeReports::Descriptions handMadeChannels(std::size_t count);
+FakeReports::Descriptions fakeChannels(std::size_t count);
 
 }  // namespace quazor
