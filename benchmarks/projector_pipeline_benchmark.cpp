@@ -4,7 +4,7 @@
 #include "backends/threads/thread_concurrency.h"
 #include "benchmarks/projector_pipeline_peer.h"
 #include "diagnostics/projector_fault/tessel_fault_experiment.h"
-#include "tests/support/hand_made_camera.h"
+#include "tests/support/fake_camera.h"
 
 #include <benchmark/benchmark.h>
 #include <unistd.h>
@@ -51,12 +51,12 @@ class BufferPool {
   // The number of references not yet released.
   int references() const {
     int references = 0;
-    for (const HandMadeBuffer& buffer : buffers_) references += buffer.references();
+    for (const FakePixelBuffer& buffer : buffers_) references += buffer.references();
     return references;
   }
 
  private:
-  std::array<HandMadeBuffer, 64> buffers_;
+  std::array<FakePixelBuffer, 64> buffers_;
   std::size_t next_ = 0;
 };
 
@@ -68,8 +68,8 @@ class StreamingExperiment {
       if (call == "start") started_.release();
     };
     experiment_ = std::make_shared<QZTesselFaultExperiment>(
-        Platform{makeHandMadeCapture(stream_), std::make_shared<RealClock>(), concurrency_,
-                 std::make_shared<HandMadeReports>(handMadeChannels(60), 0)});
+        Platform{makeFakeCapture(stream_), std::make_shared<RealClock>(), concurrency_,
+                 std::make_shared<FakeReports>(fakeChannels(60), 0)});
     static_cast<void>(
         experiment_->setupWithParameters({{"frameCount", stopCount}, {"timeout", 1e9}}, nullptr, nullptr));
     host_ = std::thread([this] { succeeded_ = experiment_->run(nullptr) != nullptr; });
@@ -90,7 +90,7 @@ class StreamingExperiment {
   SerialQueue& processing() { return *concurrency_->processing; }
 
  private:
-  std::shared_ptr<HandMadeStream> stream_ = std::make_shared<HandMadeStream>();
+  std::shared_ptr<FakeStream> stream_ = std::make_shared<FakeStream>();
   std::shared_ptr<OpenConcurrency> concurrency_ = std::make_shared<OpenConcurrency>();
   std::shared_ptr<QZTesselFaultExperiment> experiment_;
   std::binary_semaphore started_{0};

@@ -3,7 +3,7 @@
 #include "diagnostics/projector_fault/fixed_clock_for_tests.h"
 #include "diagnostics/projector_fault/tessel_fault_experiment.h"
 #include "platform/concurrency.h"
-#include "tests/support/hand_made_camera.h"
+#include "tests/support/fake_camera.h"
 
 #include <benchmark/benchmark.h>
 #include <malloc.h>
@@ -50,7 +50,7 @@ class ImmediateConcurrency final : public Concurrency {
 // Records the thread's processor time when it is called.
 class TimedReports final : public ReportFacility {
  public:
-  explicit TimedReports(HandMadeReports::Descriptions channels) : reports_(std::move(channels), 5) {}
+  explicit TimedReports(FakeReports::Descriptions channels) : reports_(std::move(channels), 5) {}
 
   std::shared_ptr<const ReportChannelSet> reportWithOnlySimpleChannels(DiagnosticErrorPtr* error) override {
     asked = processorTime();
@@ -60,15 +60,15 @@ class TimedReports final : public ReportFacility {
   std::chrono::nanoseconds asked{};
 
  private:
-  HandMadeReports reports_;
+  FakeReports reports_;
 };
 
 // Everything from the run's first call of the report facility on; its timeout ends the stream at once. The run uses
 // half of the facility's channels.
 void channels(benchmark::State& state) {
   const auto count = static_cast<std::size_t>(state.range(0));
-  const auto reports = std::make_shared<TimedReports>(handMadeChannels(count));
-  const Platform platform{makeHandMadeCapture(std::make_shared<HandMadeStream>()), std::make_shared<FixedClock>(),
+  const auto reports = std::make_shared<TimedReports>(fakeChannels(count));
+  const Platform platform{makeFakeCapture(std::make_shared<FakeStream>()), std::make_shared<FixedClock>(),
                           std::make_shared<ImmediateConcurrency>(), reports};
   const auto run = [&]() -> double {
     const auto experiment = std::make_shared<QZTesselFaultExperiment>(platform);

@@ -1,7 +1,7 @@
 // The cost of an image of the display sensor: parsing its record, compared with a plain copy of the stored samples, and
 // the way of a report from the device's callback through stream and experiment.
 #include "diagnostics/sensor_images/nimbe_image_experiment.h"
-#include "tests/support/hand_made_sensor.h"
+#include "tests/support/fake_sensor.h"
 
 #include <benchmark/benchmark.h>
 
@@ -59,7 +59,7 @@ void readValues(benchmark::State& state) {
 
 // The images are kept, as in every run, so a run gets as many reports as a long capture.
 void callback(benchmark::State& state) {
-  HandMadeSensor sensor({});
+  FakeSensor sensor({});
   const auto experiment = std::make_shared<QZNimbeImageExperiment>(sensor.platform());
   const Bytes report = imageReport(1);
   sensor.loop.at(std::chrono::nanoseconds(0), [&] {

@@ -1,6 +1,6 @@
 // The registration of the plug-in.
 #include "contract/lab.h"
-#include "tests/support/hand_made_sensor.h"
+#include "tests/support/fake_sensor.h"
 
 #include <dlfcn.h>
 #include <gtest/gtest.h>
@@ -21,7 +21,7 @@ TEST(SensorImagesPlugin, RegistersItsOneExperiment) {
   EXPECT_EQ(registration.kind, QZLab::Kind::kExperiment);
   EXPECT_EQ(registration.name, "NimbeImageExperiment");
 
-  HandMadeSensor sensor({});
+  FakeSensor sensor({});
   const Platform before = installedPlatform();
   installPlatform(sensor.platform());
   const std::shared_ptr<QZExperiment> one = registration.makeExperiment();

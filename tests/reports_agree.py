@@ -91,22 +91,22 @@ class Comparison:
             self.check_record(f"{where} junit", blurred(junit), blurred(report_readers.expected_of_junit(record)))
             self.check(f"{where}: begin", suite.get("timestamp"), stream.begin)
             record["error stage"] = junit.get("error stage", "judge")
-        self.check_unfinished(name, streams[len(records):], suites[len(records):], records, interrupted)
+        self.check_unrecorded(name, streams[len(records):], suites[len(records):], records, interrupted)
         self.compare_csv(name, report_readers.csv_rows(reports["csv"]), of_experiments, records)
         self.compare_text(name, report_readers.Lines(reports["text"]), of_experiments, records, interrupted)
 
-    def check_unfinished(self, name, streams, suites, records, interrupted):
-        self.check(f"{name}: unfinished", [one.get("name") for one in suites],
+    def check_unrecorded(self, name, streams, suites, records, interrupted):
+        self.check(f"{name}: unrecorded", [one.get("name") for one in suites],
                    [in_xml(one.start["name"]) for one in streams])
         ends = [{"ERROR": "error", "SKIP": None}[one.end["status"]] for one in streams]
-        self.check(f"{name}: unfinished verdicts", [report_readers.derived_verdict(one) for one in suites], ends)
+        self.check(f"{name}: unrecorded verdicts", [report_readers.derived_verdict(one) for one in suites], ends)
         has_record = bool(records) and records[-1]["errors"][:1] == [INTERRUPTION]
         expected = int(interrupted is not None and not has_record)
         self.check(f"{name}: interrupted ones without a record", ends.count("error"), expected)
         if expected:
             self.check(f"{name}: interrupted", streams[0].start["name"], interrupted or "quazor")
         if interrupted is None:
-            self.check(f"{name}: unfinished runs", len(streams), 0)
+            self.check(f"{name}: unrecorded runs", len(streams), 0)
         self.kinds["a run that never began"] += None in ends
         self.kinds["an interrupted run without a record"] += expected
         self.kinds["an interrupted run with a record"] += has_record

@@ -1,5 +1,7 @@
 #include "backends/faults/intercepted_capture.h"
 
+#include "tests/support/scripted_capture.h"
+
 #include <gmock/gmock.h>
 #include <gtest/gtest.h>
 
@@ -13,103 +15,33 @@ namespace {
 
 using ::testing::ElementsAre;
 
-// A device with two streams and their group, which stores the values that it receives and returns them.
-class PairStream final : public CaptureStream {
- public:
-  explicit PairStream(std::string name) : name_(std::move(name)) {}
-  std::string description() const override { return name_; }
-  std::optional<Value> valueForProperty(std::string_view, DiagnosticErrorPtr*) override { return std::nullopt; }
-  bool setValue(const Value&, std::string_view, DiagnosticErrorPtr*) override { return false; }
-  bool start(DiagnosticErrorPtr*) override { return true; }
-  bool stop(DiagnosticErrorPtr*) override { return true; }
-
- private:
-  const std::string name_;
-};
-
-class PairGroup final : public SynchronizedStreamsGroup {
- public:
-  explicit PairGroup(CaptureStreams streams) : streams_(std::move(streams)) {}
-  std::string description() const override { return "pair"; }
-  std::optional<CaptureStreams> streams(DiagnosticErrorPtr*) override { return streams_; }
-  std::optional<Value> valueForProperty(std::string_view, DiagnosticErrorPtr*) override { return kept; }
-  bool setValue(const Value& value, std::string_view, DiagnosticErrorPtr*) override {
-    kept = value;
-    return true;
-  }
-
-  std::optional<Value> kept;
-
- private:
-  const CaptureStreams streams_;
-};
-
-class PairDevice final : public CaptureDevice {
- public:
-  PairDevice(CaptureStreams streams, std::shared_ptr<PairGroup> group)
-      : streams_(std::move(streams)), group_(std::move(group)) {}
-  std::string description() const override { return "device"; }
-  std::optional<CaptureStreams> streams(DiagnosticErrorPtr*) override { return streams_; }
-  std::optional<SynchronizedStreamsGroups> synchronizedStreamsGroups(DiagnosticErrorPtr*) override {
-    return SynchronizedStreamsGroups{group_};
-  }
-  bool requestControlOfStreams(const CaptureStreams& streams, DiagnosticErrorPtr*) override {
-    controlled = streams;
-    return true;
-  }
-  bool relinquishControlOfStreams(const CaptureStreams& streams, DiagnosticErrorPtr*) override {
-    std::erase_if(controlled, [&](const auto& one) { return one == streams.front(); });
-    return true;
-  }
-  bool invalidate(DiagnosticErrorPtr*) override { return true; }
-  std::optional<Value> valueForProperty(std::string_view, DiagnosticErrorPtr*) override { return kept; }
-  bool setValue(const Value& value, std::string_view, DiagnosticErrorPtr*) override {
-    kept = value;
-    return true;
-  }
-
-  CaptureStreams controlled;
-  std::optional<Value> kept;
-
- private:
-  const CaptureStreams streams_;
-  const std::shared_ptr<PairGroup> group_;
-};
-
-class PairPlugIn final : public CapturePlugIn {
- public:
-  explicit PairPlugIn(std::shared_ptr<CaptureDevice> device) : device_(std::move(device)) {}
-  std::string description() const override { return "plug-in"; }
-  std::shared_ptr<CaptureDevice> device(DiagnosticErrorPtr*) override { return device_; }
-
- private:
-  const std::shared_ptr<CaptureDevice> device_;
-};
-
-class PairService final : public CaptureService {
- public:
-  explicit PairService(std::shared_ptr<CaptureDevice> device)
-      : plugIn_(std::make_shared<PairPlugIn>(std::move(device))) {}
-  std::shared_ptr<CapturePlugIn> createPlugIn() override { return plugIn_; }
-  std::shared_ptr<CapturePlugIn> defaultPlugIn() override { return plugIn_; }
-
- private:
-  const std::shared_ptr<CapturePlugIn> plugIn_;
-};
-
+// A device of two streams and their group.
 class InterceptedCaptureTest : public ::testing::Test {
  protected:
   InterceptedCaptureTest() {
     calls_->observe([this](const PlatformCall& call) { seen_.push_back(call.object + '|' + call.detail); });
   }
 
-  const CaptureStreams inner_{std::make_shared<PairStream>("a"), std::make_shared<PairStream>("b")};
-  const std::shared_ptr<PairGroup> innerGroup_ = std::make_shared<PairGroup>(CaptureStreams{inner_[1], inner_[0]});
-  const std::shared_ptr<PairDevice> innerDevice_ = std::make_shared<PairDevice>(inner_, innerGroup_);
+  static std::shared_ptr<ScriptedGroup> makeGroup(const CaptureStreams& streams) {
+    auto group = std::make_shared<ScriptedGroup>("pair");
+    group->members = streams;
+    return group;
+  }
+  static std::shared_ptr<ScriptedDevice> makeDevice(const CaptureStreams& streams,
+                                                    const std::shared_ptr<ScriptedGroup>& group) {
+    auto device = std::make_shared<ScriptedDevice>("device");
+    device->members = streams;
+    device->groups = {group};
+    return device;
+  }
+
+  const CaptureStreams inner_{std::make_shared<ScriptedStream>("a"), std::make_shared<ScriptedStream>("b")};
+  const std::shared_ptr<ScriptedGroup> innerGroup_ = makeGroup({inner_[1], inner_[0]});
+  const std::shared_ptr<ScriptedDevice> innerDevice_ = makeDevice(inner_, innerGroup_);
   const std::shared_ptr<CallInterceptor> calls_ =
       std::make_shared<CallInterceptor>(std::vector<Fault>{}, nullptr, nullptr, nullptr);
   const std::shared_ptr<CaptureService> service_ =
-      interceptedCapture(std::make_shared<PairService>(innerDevice_), calls_,
+      interceptedCapture(std::make_shared<ScriptedCapture>(innerDevice_), calls_,
                          std::make_shared<const ObjectNames>(ObjectNames{{"wide"}, {"back"}, nullptr}));
   const std::shared_ptr<CaptureDevice> device_ = service_->createPlugIn()->device(nullptr);
   const CaptureStreams streams_ = *device_->streams(nullptr);
@@ -123,8 +55,8 @@ TEST_F(InterceptedCaptureTest, TheGroupHasTheDevicesOwnStreams) {
 
 // As a device of its own does: who holds it may leave its streams and groups to it.
 TEST_F(InterceptedCaptureTest, ADeviceKeepsItsStreamsAndGroupsForAsLongAsItLives) {
-  const auto service =
-      interceptedCapture(std::make_shared<PairService>(innerDevice_), calls_, std::make_shared<const ObjectNames>());
+  const auto service = interceptedCapture(std::make_shared<ScriptedCapture>(innerDevice_), calls_,
+                                          std::make_shared<const ObjectNames>());
   std::shared_ptr<CaptureDevice> device = service->createPlugIn()->device(nullptr);
   const std::weak_ptr<CaptureStream> stream = device->streams(nullptr)->front();
   std::shared_ptr<SynchronizedStreamsGroup> group = device->synchronizedStreamsGroups(nullptr)->front();
@@ -143,19 +75,20 @@ TEST_F(InterceptedCaptureTest, ADeviceKeepsItsStreamsAndGroupsForAsLongAsItLives
 
 TEST_F(InterceptedCaptureTest, ObjectsInPropertiesAreTheServicesOwnOnTheOneSideAndInterceptedOnTheOther) {
   ASSERT_TRUE(group_->setValue(Array{streams_[1], streams_[0]}, "ActiveStreams", nullptr));
-  EXPECT_EQ(innerGroup_->kept, Value(Array{inner_[1], inner_[0]}));
+  EXPECT_EQ(innerGroup_->properties, (Dictionary{{"ActiveStreams", Array{inner_[1], inner_[0]}}}));
   EXPECT_EQ(group_->valueForProperty("ActiveStreams", nullptr), Value(Array{streams_[1], streams_[0]}));
 
   ASSERT_TRUE(device_->setValue(Dictionary{{"Groups", Array{group_}}, {"Count", 1}}, "Configuration", nullptr));
-  EXPECT_EQ(innerDevice_->kept, Value(Dictionary{{"Groups", Array{innerGroup_}}, {"Count", 1}}));
+  EXPECT_EQ(innerDevice_->properties,
+            (Dictionary{{"Configuration", Dictionary{{"Groups", Array{innerGroup_}}, {"Count", 1}}}}));
   EXPECT_EQ(device_->valueForProperty("Configuration", nullptr),
             Value(Dictionary{{"Groups", Array{group_}}, {"Count", 1}}));
-  innerGroup_->kept = Value(inner_[0]);
+  innerGroup_->properties.set("SynchronizationMaster", inner_[0]);
   EXPECT_EQ(group_->valueForProperty("SynchronizationMaster", nullptr), Value(streams_[0]));
 }
 
 TEST_F(InterceptedCaptureTest, ControlIsAskedForTheServicesOwnStreams) {
-  const auto foreign = std::make_shared<PairStream>("foreign");
+  const auto foreign = std::make_shared<ScriptedStream>("foreign");
   ASSERT_TRUE(device_->requestControlOfStreams({streams_[0], streams_[1], foreign}, nullptr));
   EXPECT_THAT(innerDevice_->controlled, ElementsAre(inner_[0], inner_[1], foreign));
   ASSERT_TRUE(device_->relinquishControlOfStreams({streams_[0]}, nullptr));
@@ -191,8 +124,8 @@ TEST_F(InterceptedCaptureTest, FaultsReachGroups) {
   }
   EXPECT_EQ(group_->streams(nullptr), std::nullopt);
   EXPECT_FALSE(group_->setValue(1, "ActiveStreams", nullptr));
-  EXPECT_EQ(innerGroup_->kept, std::nullopt);
-  innerGroup_->kept = Value(1);
+  EXPECT_EQ(innerGroup_->properties, Dictionary{});
+  innerGroup_->properties.set("ActiveStreams", 1);
   EXPECT_EQ(group_->valueForProperty("ActiveStreams", nullptr), std::nullopt);
   for (const FaultStatus& status : calls_->faultStatus()) EXPECT_EQ(status.fired, 1U) << status.fault.operation;
 }

@@ -4,8 +4,8 @@
 #include "backends/simulated/time/simulation_stall.h"
 #include "backends/simulated/time/virtual_services.h"
 #include "backends/threads/real_clock.h"
-#include "tests/support/hand_made_camera.h"
-#include "tests/support/hand_made_sensor.h"
+#include "tests/support/fake_camera.h"
+#include "tests/support/fake_sensor.h"
 
 #include <gmock/gmock.h>
 #include <gtest/gtest.h>
@@ -45,7 +45,7 @@ std::string lineOf(const PlatformCall& call) {
   return call.operation + '|' + call.object + '|' + call.detail + '|' + (call.succeeded ? '+' : '-');
 }
 
-// Hand-written services behind interceptors, in virtual time by default.
+// Fake services behind interceptors, in virtual time by default.
 class InterceptedPlatformTest : public ::testing::Test {
  protected:
   void intercept(Platform platform, ObjectNames names, TestTime time = virtualTime()) {
@@ -94,8 +94,8 @@ class CameraUnderFaults : public InterceptedPlatformTest {
  protected:
   void open(TestTime time = virtualTime()) {
     Platform platform;
-    platform.capture = makeHandMadeCapture(inner_);
-    platform.reports = std::make_shared<HandMadeReports>(handMadeChannels(2), 5);
+    platform.capture = makeFakeCapture(inner_);
+    platform.reports = std::make_shared<FakeReports>(fakeChannels(2), 5);
     intercept(std::move(platform), {{"infrared"}, {}}, std::move(time));
     device_ = platform_.capture->createPlugIn()->device(nullptr);
     ASSERT_NE(device_, nullptr);
@@ -106,7 +106,7 @@ class CameraUnderFaults : public InterceptedPlatformTest {
     return outcomeOf([this](auto* error) { return stream_->start(error); });
   }
 
-  const std::shared_ptr<HandMadeStream> inner_ = std::make_shared<HandMadeStream>();
+  const std::shared_ptr<FakeStream> inner_ = std::make_shared<FakeStream>();
   std::shared_ptr<CaptureDevice> device_;
   std::shared_ptr<CaptureStream> stream_;
 };
@@ -299,7 +299,7 @@ class SensorUnderFaults : public InterceptedPlatformTest {
     return manager->devices().front();
   }
 
-  HandMadeSensor sensor_{{}};
+  FakeSensor sensor_{{}};
 };
 
 TEST_F(SensorUnderFaults, WithoutFaultsEveryCallIsMadeAndTold) {

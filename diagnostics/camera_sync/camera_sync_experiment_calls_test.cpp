@@ -1,10 +1,10 @@
 // The exact arguments of the experiment's calls to the capture service, including types and objects.
-#include "tests/support/fake_capture.h"
+#include "diagnostics/camera_sync/camera_sync_for_tests.h"
 
 namespace quazor {
 namespace {
 
-using CameraSyncExperimentCalls = FakeCaptureTest;
+using CameraSyncExperimentCalls = ScriptedCameraSyncTest;
 
 // Checks the configuration of a slave; the ratio may be a signed or unsigned integer.
 void expectSlaveConfiguration(const Value* configuration, const std::string& whose) {

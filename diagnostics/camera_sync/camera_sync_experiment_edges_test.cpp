@@ -1,5 +1,5 @@
 // The experiment with capture services that return values no healthy phone returns.
-#include "tests/support/fake_capture.h"
+#include "diagnostics/camera_sync/camera_sync_for_tests.h"
 
 #include <cstdint>
 #include <limits>
@@ -7,7 +7,7 @@
 namespace quazor {
 namespace {
 
-using CameraSyncExperimentEdges = FakeCaptureTest;
+using CameraSyncExperimentEdges = ScriptedCameraSyncTest;
 
 // The log line for the wide camera's session entry if that camera is the master.
 std::string reportLine(std::string_view offset, std::string_view frames, std::string_view total) {

@@ -1,5 +1,5 @@
 // The experiment's description, setup and lifetime.
-#include "tests/support/fake_capture.h"
+#include "diagnostics/camera_sync/camera_sync_for_tests.h"
 
 #include <cmath>
 #include <cstdint>
@@ -8,7 +8,7 @@
 namespace quazor {
 namespace {
 
-using CameraSyncExperimentSetup = FakeCaptureTest;
+using CameraSyncExperimentSetup = ScriptedCameraSyncTest;
 
 constexpr double kNaN = std::numeric_limits<double>::quiet_NaN();
 constexpr double kInfinity = std::numeric_limits<double>::infinity();

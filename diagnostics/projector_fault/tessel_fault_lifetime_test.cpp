@@ -3,7 +3,7 @@
 
 #include "backends/simulated/simulated_phone.h"
 #include "platform/capture_keys.h"
-#include "tests/support/hand_made_camera.h"
+#include "tests/support/fake_camera.h"
 #include "tests/sweeps/projector_bench.h"
 
 #include <gtest/gtest.h>
@@ -51,14 +51,14 @@ TEST(TesselFaultLifetime, LeavesFramesAndEventsAloneWhenItIsGone) {
 // A queued intake does not keep the experiment alive.
 TEST(TesselFaultLifetime, IsNotKeptByFramesOnTheirWay) {
   SimulatedPhone phone(projectorScenario(), PhoneTime::kVirtual, 1);
-  const auto stream = std::make_shared<HandMadeStream>();
+  const auto stream = std::make_shared<FakeStream>();
   Platform platform = phone.platform();
-  platform.capture = makeHandMadeCapture(stream);
+  platform.capture = makeFakeCapture(stream);
   auto experiment = std::make_shared<QZTesselFaultExperiment>(platform);
   ASSERT_TRUE(experiment->setupWithParameters({{"timeout", 0}}, nullptr, nullptr));
   ASSERT_NE(experiment->run(nullptr), nullptr);
   phone.scheduler()->blockUntil(milliseconds(10), "all that the run has left");
-  HandMadeBuffer buffer;
+  FakePixelBuffer buffer;
   stream->frameHandler()(buffer, MediaTime{});
   EXPECT_EQ(buffer.references(), 1);
   const std::weak_ptr<QZTesselFaultExperiment> watched = experiment;

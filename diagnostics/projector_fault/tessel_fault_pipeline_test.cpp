@@ -3,7 +3,7 @@
 #include "backends/simulated/time/simulation_stall.h"
 #include "diagnostics/projector_fault/tessel_fault_experiment.h"
 #include "platform/capture_keys.h"
-#include "tests/support/hand_made_camera.h"
+#include "tests/support/fake_camera.h"
 #include "tests/sweeps/projector_bench.h"
 
 #include <gtest/gtest.h>
@@ -377,10 +377,10 @@ TEST(TesselFaultPipeline, CountsErrorsWithoutACounterAsNone) {
 
 TEST(TesselFaultPipeline, CountsEveryErrorAsNoneWhenTheCountersAreNoDictionary) {
   const SimulatedPhone phone(projectorScenario(), PhoneTime::kVirtual, 1);
-  const auto stream = std::make_shared<HandMadeStream>();
+  const auto stream = std::make_shared<FakeStream>();
   stream->errorCounters = Value(7);
   Platform platform = phone.platform();
-  platform.capture = makeHandMadeCapture(stream);
+  platform.capture = makeFakeCapture(stream);
   const auto experiment = std::make_shared<QZTesselFaultExperiment>(platform);
   ASSERT_TRUE(experiment->setupWithParameters({{"timeout", 0}}, nullptr, nullptr));
   RunTranscript transcript;

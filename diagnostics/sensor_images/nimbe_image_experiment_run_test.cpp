@@ -2,7 +2,7 @@
 #include "contract/message_format.h"
 #include "diagnostics/sensor_images/nimbe_image_experiment.h"
 #include "tests/support/call_failures.h"
-#include "tests/support/hand_made_sensor.h"
+#include "tests/support/fake_sensor.h"
 #include "tests/support/run_transcript.h"
 #include "tests/support/thrown_text.h"
 
@@ -37,7 +37,7 @@ std::string imageText(std::uint32_t frameID) {
          "; tmonDataInC = 36.6; timestampInMilliseconds = " + timestamp + "}";
 }
 
-using Change = std::function<void(HandMadeSensor& sensor)>;
+using Change = std::function<void(FakeSensor& sensor)>;
 
 // A run with two images within three seconds: everything that it does and returns is `trace`, in which "@1" stands for
 // the first image and so on.
@@ -53,8 +53,8 @@ class NimbeImageRun : public testing::TestWithParam<Run> {
  protected:
   static std::string run(bool hasOwnError, ErrorPlace place) {
     RunTranscript transcript;
-    HandMadeSensor sensor([&](std::string_view operation, std::string_view object, std::string_view detail,
-                              bool succeeded) { transcript.addCall(operation, object, detail, succeeded); });
+    FakeSensor sensor([&](std::string_view operation, std::string_view object, std::string_view detail,
+                          bool succeeded) { transcript.addCall(operation, object, detail, succeeded); });
     if (hasOwnError) sensor.device->ownError = makeError("BenchErrorDomain", 7, "Broken.");
     GetParam().change(sensor);
     const auto experiment = GetParam().hasStream ? std::make_shared<QZNimbeImageExperiment>(sensor.platform())
@@ -87,7 +87,7 @@ struct Sent {
   std::optional<Bytes> report = {};
 };
 Change sends(std::vector<Sent> reports, std::optional<int> failure = std::nullopt) {
-  return [reports = std::move(reports), failure](HandMadeSensor& sensor) {
+  return [reports = std::move(reports), failure](FakeSensor& sensor) {
     for (const Sent& sent : reports) {
       sensor.loop.at(milliseconds(sent.milliseconds), [&sensor, sent] {
         sensor.device->send(sent.reportID, sent.report ? *sent.report : imageReport(sent.frameID));
@@ -100,7 +100,7 @@ Change sends(std::vector<Sent> reports, std::optional<int> failure = std::nullop
 }
 
 Change unscheduledAt(int time) {
-  return [time](HandMadeSensor& sensor) {
+  return [time](FakeSensor& sensor) {
     sensor.loop.at(milliseconds(time),
                    [&sensor] { sensor.device->unscheduleFromRunLoop(sensor.loop, kRunLoopDefaultMode); });
   };
@@ -140,24 +140,24 @@ const Run kRuns[] = {
      sends({{33, 1}, {66, 2}, {66, 3}})},
     {"PassesOverReportsThatAreNoImages", kOpened + "loop stop\n" + kClosed + ended("stopped") + images("@1, @2"),
      sends({{1, 3, 0x75}, {2, 3, 0x76, Bytes(791)}, {3, 1}, {4, 3, 0x77}, {5, 2}})},
-    {"FailsWithoutAStream", failure("3: Failed to create nimbe stream."), [](HandMadeSensor&) {}, false},
+    {"FailsWithoutAStream", failure("3: Failed to create nimbe stream."), [](FakeSensor&) {}, false},
     {"FailsWithoutADevice", kMatching + "manager devices 0\n" + failure("3: Nimbe device match was ambiguous!"),
-     [](HandMadeSensor& sensor) { sensor.matchingDevices.clear(); }},
+     [](FakeSensor& sensor) { sensor.matchingDevices.clear(); }},
     {"FailsWithTwoDevices", kMatching + "manager devices 2\n" + failure("3: Nimbe device match was ambiguous!"),
-     [](HandMadeSensor& sensor) { sensor.matchingDevices.push_back(sensor.device); }},
+     [](FakeSensor& sensor) { sensor.matchingDevices.push_back(sensor.device); }},
     {"FailsWhenTheDeviceDoesNotOpen",
      kFound + "sensor open -> failed\n" + failure("3: Could not open Nimbe device.{cause}"),
-     [](HandMadeSensor& sensor) { sensor.device->opens = false; }},
+     [](FakeSensor& sensor) { sensor.device->opens = false; }},
     {"FailsWhenThePowerModeIsRefused",
      kFound + "sensor open\nsensor setInputReportCallback\nsensor setFeatureReport 171 = ab01 -> failed\n" +
          failure("4: Failed to override power mode to active!{cause}"),
-     [](HandMadeSensor& sensor) { sensor.device->refusedReports = {0xAB}; }},
+     [](FakeSensor& sensor) { sensor.device->refusedReports = {0xAB}; }},
     {"FailsWhenTheStreamingModeIsRefused",
      kFound +
          "sensor open\nsensor setInputReportCallback\nsensor setFeatureReport 171 = ab01\n"
          "sensor setFeatureReport 172 = ac01 -> failed\n" +
          failure("5: Failed to set streaming mode to images only!{cause}"),
-     [](HandMadeSensor& sensor) { sensor.device->refusedReports = {0xAC}; }},
+     [](FakeSensor& sensor) { sensor.device->refusedReports = {0xAC}; }},
     {"FailsWhenTheTimeIsUpAndDropsItsImages", kOpened + kClosed + ended("timed out") + kTimedOut,
      sends({{33, 1}, {3001, 2}})},
     {"FailsWithTheVeryErrorOfTheDevice", kOpened + kClosed + "loop stop\n" + kClosed + ended("stopped") + kGone,
@@ -170,7 +170,7 @@ const Run kRuns[] = {
      kOpened + kClosed + "loop stop\n" + kClosed + ended("timed out") + kTimedOut, sends({}, 3000)},
     {"ReturnsWhatItHasWhenTheDeviceHasLeftTheLoop",
      kOpened + "sensor unschedule default\n" + kClosed + ended("finished") + images("@1"),
-     [](HandMadeSensor& sensor) {
+     [](FakeSensor& sensor) {
        sends({{33, 1}})(sensor);
        unscheduledAt(40)(sensor);
      }},
@@ -183,8 +183,9 @@ INSTANTIATE_TEST_SUITE_P(Runs, NimbeImageRun, testing::ValuesIn(kRuns),
 
 TEST(NimbeImageRunAlone, LetsTheExceptionOfAMissingHidManagerThrough) {
   RunTranscript transcript;
-  HandMadeSensor sensor([&](std::string_view operation, std::string_view object, std::string_view detail,
-                            bool succeeded) { transcript.addCall(operation, object, detail, succeeded); });
+  FakeSensor sensor([&](std::string_view operation, std::string_view object, std::string_view detail, bool succeeded) {
+    transcript.addCall(operation, object, detail, succeeded);
+  });
   sensor.hasHidManager = false;
   const auto experiment = std::make_shared<QZNimbeImageExperiment>(sensor.platform());
   ASSERT_TRUE(experiment->setupWithParameters({{"images", 1}, {"timeout", 1}}, nullptr, nullptr));

@@ -1,7 +1,7 @@
 // The experiment's description, setup and lifetime.
 #include "diagnostics/sensor_images/nimbe_image_experiment.h"
 
-#include "tests/support/hand_made_sensor.h"
+#include "tests/support/fake_sensor.h"
 #include "tests/support/run_transcript.h"
 
 #include <gtest/gtest.h>
@@ -55,7 +55,7 @@ class NimbeImageExperiment : public testing::Test {
   RunTranscript transcript;
   const CallRecorder recorder = [this](std::string_view operation, std::string_view object, std::string_view detail,
                                        bool succeeded) { transcript.addCall(operation, object, detail, succeeded); };
-  HandMadeSensor sensor{recorder};
+  FakeSensor sensor{recorder};
 
  private:
   std::size_t seen_ = 0;
@@ -109,27 +109,27 @@ TEST_F(NimbeImageExperiment, LooksForThePowerOfTheDisplayAndForALoop) {
 TEST_F(NimbeImageExperiment, TellsWhyItCannotBeSetUp) {
   const struct {
     const char* name;
-    std::function<void(HandMadeSensor& phone)> damage;
+    std::function<void(FakeSensor& phone)> damage;
     std::string calls;
     std::string error;
   } rows[] = {
-      {"no display", [](HandMadeSensor& phone) { phone.hasDisplay = false; }, "framebuffer mainDisplay -> failed\n",
+      {"no display", [](FakeSensor& phone) { phone.hasDisplay = false; }, "framebuffer mainDisplay -> failed\n",
        "code 2: Could not get the main display to determine device power state."},
-      {"no registry entry", [](HandMadeSensor& phone) { phone.hasRegistryService = false; },
+      {"no registry entry", [](FakeSensor& phone) { phone.hasRegistryService = false; },
        "framebuffer mainDisplay\ndisplay registryService -> failed\n",
        "code 2: Could not get the frame buffer to determine device power state."},
-      {"no property", [](HandMadeSensor& phone) { phone.displayProperty.reset(); },
+      {"no property", [](FakeSensor& phone) { phone.displayProperty.reset(); },
        "framebuffer mainDisplay\ndisplay registryService\nregistry registryProperty DSPLY Debug Info -> failed\n",
        "code 2: Could not find the display power state."},
-      {"no power", [](HandMadeSensor& phone) { phone.displayProperty = displayPropertyOf(0); },
+      {"no power", [](FakeSensor& phone) { phone.displayProperty = displayPropertyOf(0); },
        std::string(kPoweredDisplay), "code 2: The display is not powered."},
-      {"no loop", [](HandMadeSensor& phone) { phone.hasRunLoop = false; },
+      {"no loop", [](FakeSensor& phone) { phone.hasRunLoop = false; },
        std::string(kPoweredDisplay) + "thread currentRunLoop -> failed\n",
        "code 1: Nimbe is a HID device that requires a current run loop."},
   };
   for (const auto& row : rows) {
     SCOPED_TRACE(row.name);
-    HandMadeSensor broken(recorder);
+    FakeSensor broken(recorder);
     row.damage(broken);
     const auto experiment = std::make_shared<QZNimbeImageExperiment>(broken.platform());
     (void)calls();
@@ -208,7 +208,7 @@ TEST_F(NimbeImageExperiment, ReadsItsParametersAsUnsignedNumbers) {
   };
   for (const auto& row : rows) {
     SCOPED_TRACE(row.name);
-    HandMadeSensor idle(recorder);
+    FakeSensor idle(recorder);
     const auto experiment = std::make_shared<QZNimbeImageExperiment>(idle.platform());
     ASSERT_TRUE(experiment->setupWithParameters(row.parameters, nullptr, nullptr));
     (void)calls();
@@ -238,7 +238,7 @@ TEST_F(NimbeImageExperiment, StopsWhenItHasTheImagesThatWereAskedFor) {
   };
   for (const auto& row : rows) {
     SCOPED_TRACE(row.name);
-    HandMadeSensor sending({});
+    FakeSensor sending({});
     for (std::uint32_t i = 1; i <= 10; ++i) {
       sending.loop.at(milliseconds(i), [&, i] { sending.device->send(0x76, imageReport(i)); });
     }

@@ -1,6 +1,6 @@
 #include "diagnostics/sensor_images/nimbe_image_stream.h"
 
-#include "tests/support/hand_made_sensor.h"
+#include "tests/support/fake_sensor.h"
 #include "tests/support/run_transcript.h"
 #include "tests/support/thrown_text.h"
 
@@ -55,7 +55,7 @@ class NimbeImageStream : public testing::Test {
   RunTranscript transcript;
   const CallRecorder recorder = [this](std::string_view operation, std::string_view object, std::string_view detail,
                                        bool succeeded) { transcript.addCall(operation, object, detail, succeeded); };
-  HandMadeSensor sensor{recorder};
+  FakeSensor sensor{recorder};
   std::shared_ptr<KeepingDelegate> delegate = std::make_shared<KeepingDelegate>();
   std::shared_ptr<QZNimbeImageStream> stream = std::make_shared<QZNimbeImageStream>(sensor.platform());
 
@@ -91,23 +91,23 @@ TEST_F(NimbeImageStream, TellsWhyItDoesNotOpen) {
   const std::string opened = found + "manager devices 1\nsensor open\nsensor setInputReportCallback\n";
   const struct {
     const char* name;
-    std::function<void(HandMadeSensor& phone)> damage;
+    std::function<void(FakeSensor& phone)> damage;
     std::string calls;
     std::string error;
     bool canHaveCause;
   } rows[] = {
-      {"no device", [](HandMadeSensor& phone) { phone.matchingDevices.clear(); }, found + "manager devices 0\n",
+      {"no device", [](FakeSensor& phone) { phone.matchingDevices.clear(); }, found + "manager devices 0\n",
        "QZNimbeImageExperimentErrorDomain code 3: Nimbe device match was ambiguous!", false},
-      {"two devices", [](HandMadeSensor& phone) { phone.matchingDevices.push_back(phone.device); },
+      {"two devices", [](FakeSensor& phone) { phone.matchingDevices.push_back(phone.device); },
        found + "manager devices 2\n", "QZNimbeImageExperimentErrorDomain code 3: Nimbe device match was ambiguous!",
        false},
-      {"a device that does not open", [](HandMadeSensor& phone) { phone.device->opens = false; },
+      {"a device that does not open", [](FakeSensor& phone) { phone.device->opens = false; },
        found + "manager devices 1\nsensor open -> failed\n",
        "QZNimbeImageExperimentErrorDomain code 3: Could not open Nimbe device.", true},
-      {"the power mode is refused", [](HandMadeSensor& phone) { phone.device->refusedReports = {0xAB}; },
+      {"the power mode is refused", [](FakeSensor& phone) { phone.device->refusedReports = {0xAB}; },
        opened + "sensor setFeatureReport 171 = ab01 -> failed\n",
        "QZNimbeImageExperimentErrorDomain code 4: Failed to override power mode to active!", true},
-      {"the streaming mode is refused", [](HandMadeSensor& phone) { phone.device->refusedReports = {0xAC}; },
+      {"the streaming mode is refused", [](FakeSensor& phone) { phone.device->refusedReports = {0xAC}; },
        opened + "sensor setFeatureReport 171 = ab01\nsensor setFeatureReport 172 = ac01 -> failed\n",
        "QZNimbeImageExperimentErrorDomain code 5: Failed to set streaming mode to images only!", true},
   };
@@ -116,7 +116,7 @@ TEST_F(NimbeImageStream, TellsWhyItDoesNotOpen) {
     for (const bool hasOwn : {true, false}) {
       for (const ErrorPlace place : {ErrorPlace::kGiven, ErrorPlace::kNone}) {
         SCOPED_TRACE(row.name);
-        HandMadeSensor broken(recorder);
+        FakeSensor broken(recorder);
         row.damage(broken);
         if (hasOwn) broken.device->ownError = own;
         (void)calls();

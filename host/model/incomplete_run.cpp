@@ -17,24 +17,24 @@ bool saysItWasInterrupted(const DiagnosticRecord& record) {
 
 }  // namespace
 
-Unfinished unfinishedOf(const RunStarted& run, const std::vector<DiagnosticRecord>& records,
-                        const std::optional<std::string>& interrupted) {
-  Unfinished unfinished;
+UnrecordedDiagnostics unrecordedDiagnosticsOf(const RunStarted& run, const std::vector<DiagnosticRecord>& records,
+                                              const std::optional<std::string>& interrupted) {
+  UnrecordedDiagnostics unrecorded;
   std::map<std::string, std::size_t> begun;
   for (const DiagnosticRecord& record : records) ++begun[record.name];
   if (interrupted && (records.empty() || !saysItWasInterrupted(records.back()))) {
-    unfinished.interrupted = *interrupted;
+    unrecorded.interrupted = *interrupted;
     ++begun[*interrupted];
   }
   for (const std::string& name : run.names) {
     std::size_t& left = begun[name];
     if (left == 0) {
-      unfinished.neverRun.push_back(name);
+      unrecorded.neverRun.push_back(name);
     } else {
       --left;
     }
   }
-  return unfinished;
+  return unrecorded;
 }
 
 DiagnosticErrorPtr interruptionOf(const RunStarted& run, const std::string& interrupted) {

@@ -9,7 +9,7 @@
 
 namespace quazor {
 
-struct Unfinished {
+struct UnrecordedDiagnostics {
   // The diagnostic that was running at the interruption, unless its record already says so. Empty text: none was
   // running.
   std::optional<std::string> interrupted;
@@ -17,8 +17,8 @@ struct Unfinished {
 };
 
 // `interrupted` as in RunEnded.
-Unfinished unfinishedOf(const RunStarted& run, const std::vector<DiagnosticRecord>& records,
-                        const std::optional<std::string>& interrupted);
+UnrecordedDiagnostics unrecordedDiagnosticsOf(const RunStarted& run, const std::vector<DiagnosticRecord>& records,
+                                              const std::optional<std::string>& interrupted);
 
 // The error to report for an interruption that no record shows. `interrupted` is the diagnostic that was running, or
 // empty.

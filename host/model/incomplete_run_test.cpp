@@ -17,46 +17,50 @@ RunStarted runOf(std::vector<std::string> names) {
   return run;
 }
 
-TEST(Unfinished, IsNothingWhenAllHaveRecords) {
-  const Unfinished unfinished =
-      unfinishedOf(runOf({"A", "B"}), {recordOf("A", Verdict::kPass), recordOf("B", Verdict::kError)}, {});
-  EXPECT_EQ(unfinished.interrupted, std::nullopt);
-  EXPECT_THAT(unfinished.neverRun, testing::IsEmpty());
+TEST(UnrecordedDiagnostics, AreNoneWhenAllHaveRecords) {
+  const UnrecordedDiagnostics unrecorded =
+      unrecordedDiagnosticsOf(runOf({"A", "B"}), {recordOf("A", Verdict::kPass), recordOf("B", Verdict::kError)}, {});
+  EXPECT_EQ(unrecorded.interrupted, std::nullopt);
+  EXPECT_THAT(unrecorded.neverRun, testing::IsEmpty());
 }
 
-TEST(Unfinished, IsWhatWasInterruptedAndWhatCameBehind) {
-  const Unfinished unfinished = unfinishedOf(runOf({"A", "B", "C", "D"}), {recordOf("A", Verdict::kPass)}, "B");
-  EXPECT_EQ(unfinished.interrupted, "B");
-  EXPECT_THAT(unfinished.neverRun, ElementsAre("C", "D"));
+TEST(UnrecordedDiagnostics, AreTheInterruptedOneAndThoseAfterIt) {
+  const UnrecordedDiagnostics unrecorded =
+      unrecordedDiagnosticsOf(runOf({"A", "B", "C", "D"}), {recordOf("A", Verdict::kPass)}, "B");
+  EXPECT_EQ(unrecorded.interrupted, "B");
+  EXPECT_THAT(unrecorded.neverRun, ElementsAre("C", "D"));
 }
 
-TEST(Unfinished, TellsAnInterruptBetweenTwo) {
-  const Unfinished unfinished = unfinishedOf(runOf({"A", "B"}), {recordOf("A", Verdict::kPass)}, "");
-  EXPECT_EQ(unfinished.interrupted, "");
-  EXPECT_THAT(unfinished.neverRun, ElementsAre("B"));
-  EXPECT_EQ(unfinishedOf(runOf({"A"}), {}, "").interrupted, "");
+TEST(UnrecordedDiagnostics, HaveAnEmptyNameForAnInterruptBetweenTwo) {
+  const UnrecordedDiagnostics unrecorded =
+      unrecordedDiagnosticsOf(runOf({"A", "B"}), {recordOf("A", Verdict::kPass)}, "");
+  EXPECT_EQ(unrecorded.interrupted, "");
+  EXPECT_THAT(unrecorded.neverRun, ElementsAre("B"));
+  EXPECT_EQ(unrecordedDiagnosticsOf(runOf({"A"}), {}, "").interrupted, "");
 }
 
-TEST(Unfinished, LeavesOutAnInterruptedOneThatHasARecordOfIt) {
+TEST(UnrecordedDiagnostics, LeaveOutAnInterruptedOneWhoseRecordSaysSo) {
   DiagnosticRecord record = recordOf("B", Verdict::kError);
   record.error = hostError(HostErrorCode::kInterrupted, "it was interrupted");
-  const Unfinished unfinished = unfinishedOf(runOf({"A", "B", "C"}), {recordOf("A", Verdict::kPass), record}, "B");
-  EXPECT_EQ(unfinished.interrupted, std::nullopt);
-  EXPECT_THAT(unfinished.neverRun, ElementsAre("C"));
+  const UnrecordedDiagnostics unrecorded =
+      unrecordedDiagnosticsOf(runOf({"A", "B", "C"}), {recordOf("A", Verdict::kPass), record}, "B");
+  EXPECT_EQ(unrecorded.interrupted, std::nullopt);
+  EXPECT_THAT(unrecorded.neverRun, ElementsAre("C"));
 }
 
-TEST(Unfinished, TakesOnlyTheHostsOwnErrorForARecordOfIt) {
+TEST(UnrecordedDiagnostics, HaveAnInterruptedOneWhoseRecordTellsOfAnotherError) {
   DiagnosticRecord record = recordOf("A", Verdict::kError);
   const auto code = static_cast<std::int64_t>(HostErrorCode::kInterrupted);
   record.error = errorWithMessage("Domain", code, "another's", nullptr);
-  EXPECT_EQ(unfinishedOf(runOf({"A", "B"}), {record}, "B").interrupted, "B");
+  EXPECT_EQ(unrecordedDiagnosticsOf(runOf({"A", "B"}), {record}, "B").interrupted, "B");
   record.error = hostError(HostErrorCode::kCrashed, "it crashed");
-  EXPECT_EQ(unfinishedOf(runOf({"A", "B"}), {record}, "B").interrupted, "B");
+  EXPECT_EQ(unrecordedDiagnosticsOf(runOf({"A", "B"}), {record}, "B").interrupted, "B");
 }
 
-TEST(Unfinished, CountsWhatIsRunSeveralTimes) {
-  const Unfinished unfinished = unfinishedOf(runOf({"A", "A", "A", "A"}), {recordOf("A", Verdict::kPass)}, "A");
-  EXPECT_THAT(unfinished.neverRun, ElementsAre("A", "A"));
+TEST(UnrecordedDiagnostics, CountEveryRunOfADiagnostic) {
+  const UnrecordedDiagnostics unrecorded =
+      unrecordedDiagnosticsOf(runOf({"A", "A", "A", "A"}), {recordOf("A", Verdict::kPass)}, "A");
+  EXPECT_THAT(unrecorded.neverRun, ElementsAre("A", "A"));
 }
 
 TEST(Interruption, IsTheHostsError) {

@@ -92,7 +92,7 @@ JUnitSuite suiteOf(const RunStarted& run, const DiagnosticRecord& record) {
   return suite;
 }
 
-JUnitSuite suiteOfUnfinished(const RunStarted& run, const std::string& name, Date date) {
+JUnitSuite suiteOfUnrecorded(const RunStarted& run, const std::string& name, Date date) {
   JUnitSuite suite(name, date, date);
   suite.properties().add("seed", std::to_string(run.seed));
   addRun(suite.properties(), run);
@@ -111,15 +111,15 @@ std::string junitReport(const RunStarted& run, const std::vector<DiagnosticRecor
   };
   for (const DiagnosticRecord& record : records) add(suiteOf(run, record));
   const Date end = records.empty() ? run.date : records.back().end;
-  const Unfinished unfinished = unfinishedOf(run, records, interrupted);
-  if (unfinished.interrupted) {
-    const std::string& name = *unfinished.interrupted;
-    JUnitSuite suite = suiteOfUnfinished(run, name.empty() ? "quazor" : name, end);
+  const UnrecordedDiagnostics unrecorded = unrecordedDiagnosticsOf(run, records, interrupted);
+  if (unrecorded.interrupted) {
+    const std::string& name = *unrecorded.interrupted;
+    JUnitSuite suite = suiteOfUnrecorded(run, name.empty() ? "quazor" : name, end);
     suite.addError("interrupted", {}, interruptionOf(run, name));
     add(suite);
   }
-  for (const std::string& name : unfinished.neverRun) {
-    JUnitSuite suite = suiteOfUnfinished(run, name, end);
+  for (const std::string& name : unrecorded.neverRun) {
+    JUnitSuite suite = suiteOfUnrecorded(run, name, end);
     suite.addSkipped("never-run", "The run ended before this was started.");
     add(suite);
   }

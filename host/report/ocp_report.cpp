@@ -283,19 +283,19 @@ std::string ocpReport(const RunStarted& run, const std::vector<DiagnosticRecord>
   std::string report;
   Date end = run.date;
   for (const DiagnosticRecord& record : records) end = RecordWriter(report, run, record).write();
-  const Unfinished unfinished = unfinishedOf(run, records, interrupted);
+  const UnrecordedDiagnostics unrecorded = unrecordedDiagnosticsOf(run, records, interrupted);
   const std::vector<LogLine> noLog;
-  if (unfinished.interrupted) {
-    const bool betweenTwo = unfinished.interrupted->empty();
-    const std::string name = betweenTwo ? "quazor" : *unfinished.interrupted;
+  if (unrecorded.interrupted) {
+    const bool betweenTwo = unrecorded.interrupted->empty();
+    const std::string name = betweenTwo ? "quazor" : *unrecorded.interrupted;
     OcpStream stream(report, noLog, end);
     stream.addToRun("testRunStart",
                     startJson(run, name, commandOf(run, betweenTwo ? run.names : std::vector{name}, {})), end);
-    addErrors(interruptionOf(run, *unfinished.interrupted),
+    addErrors(interruptionOf(run, *unrecorded.interrupted),
               [&stream, end](Json error) { stream.addToRun("error", std::move(error), end); });
     stream.end("ERROR", "NOT_APPLICABLE", end);
   }
-  for (const std::string& name : unfinished.neverRun) {
+  for (const std::string& name : unrecorded.neverRun) {
     OcpStream stream(report, noLog, end);
     stream.addToRun("testRunStart", startJson(run, name, commandOf(run, {name}, {})), end);
     stream.addToRun("log", {{"severity", "INFO"}, {"message", "The run ended before this was started."}}, end);

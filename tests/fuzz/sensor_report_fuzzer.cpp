@@ -1,7 +1,7 @@
 // Arbitrary input reports in any order, mixed with errors, closes and removals: only complete images reach the
 // receiver, with the values in their bytes, and nothing follows an error.
 #include "diagnostics/sensor_images/nimbe_image_experiment.h"
-#include "tests/support/hand_made_sensor.h"
+#include "tests/support/fake_sensor.h"
 
 #include <algorithm>
 #include <bit>
@@ -204,7 +204,7 @@ class StreamRun {
     };
   }
 
-  HandMadeSensor sensor_{{}};
+  FakeSensor sensor_{{}};
   std::shared_ptr<Receiver> receiver_ = std::make_shared<Receiver>();
   std::shared_ptr<QZNimbeImageStream> stream_;
   bool hasReceiver_ = true;
@@ -309,7 +309,7 @@ class ExperimentRun {
     }
   }
 
-  HandMadeSensor sensor_{{}};
+  FakeSensor sensor_{{}};
   std::size_t images_;
   std::size_t timeout_;
   std::size_t batches_ = 0;

@@ -4,6 +4,7 @@
 #include "contract/message_format.h"
 #include "platform/capture_service.h"
 
+#include <algorithm>
 #include <functional>
 #include <memory>
 #include <optional>
@@ -105,15 +106,20 @@ class ScriptedDevice final : public ScriptedObject<CaptureDevice> {
     return ask("synchronizedStreamsGroups", "", true, error) ? std::optional(groups) : std::nullopt;
   }
   bool requestControlOfStreams(const CaptureStreams& streams, DiagnosticErrorPtr* error) override {
-    return ask("requestControlOfStreams", listOf(streams), true, error);
+    if (!ask("requestControlOfStreams", listOf(streams), true, error)) return false;
+    controlled.insert(controlled.end(), streams.begin(), streams.end());
+    return true;
   }
   bool relinquishControlOfStreams(const CaptureStreams& streams, DiagnosticErrorPtr* error) override {
-    return ask("relinquishControlOfStreams", listOf(streams), true, error);
+    if (!ask("relinquishControlOfStreams", listOf(streams), true, error)) return false;
+    std::erase_if(controlled, [&](const auto& one) { return std::ranges::find(streams, one) != streams.end(); });
+    return true;
   }
   bool invalidate(DiagnosticErrorPtr* error) override { return ask("invalidate", "", true, error); }
 
   std::optional<CaptureStreams> members;
   SynchronizedStreamsGroups groups;
+  CaptureStreams controlled;  // in the order of the requests
 
  private:
   static std::string listOf(const CaptureStreams& streams) {

@@ -3,7 +3,7 @@
 #include "backends/threads/thread_concurrency.h"
 #include "diagnostics/camera_sync/camera_sync_experiment.h"
 #include "diagnostics/projector_fault/tessel_fault_experiment.h"
-#include "tests/support/hand_made_camera.h"
+#include "tests/support/fake_camera.h"
 
 #include <atomic>
 #include <cerrno>
@@ -219,7 +219,7 @@ class ProjectorFaultOnLinuxTest : public testing::Test {
     platform.capture = fake_.capture;
     platform.clock = std::make_shared<FakeClock>(fake_.kernel);
     platform.concurrency = std::make_shared<ThreadConcurrency>();
-    platform.reports = std::make_shared<HandMadeReports>(handMadeChannels(1), 0);
+    platform.reports = std::make_shared<FakeReports>(fakeChannels(1), 0);
     const auto experiment = std::make_shared<QZTesselFaultExperiment>(std::move(platform));
     std::atomic<bool> ended = false;
     const std::uint64_t begin = fake_.capture->framesDelivered();

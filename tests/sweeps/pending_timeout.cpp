@@ -3,7 +3,7 @@
 #include "backends/threads/real_clock.h"
 #include "backends/threads/thread_concurrency.h"
 #include "diagnostics/projector_fault/tessel_fault_experiment.h"
-#include "tests/support/hand_made_camera.h"
+#include "tests/support/fake_camera.h"
 
 #include <cstdio>
 #include <memory>
@@ -13,14 +13,14 @@ int main() {
   using namespace quazor;
   // The experiment is never destroyed and may use its clock until the process ends.
   const auto clock = std::make_shared<RealClock>();
-  const auto stream = std::make_shared<HandMadeStream>();
-  HandMadeBuffer buffer;
+  const auto stream = std::make_shared<FakeStream>();
+  FakePixelBuffer buffer;
   stream->onCall = [&buffer, frames = stream.get()](std::string_view call) {
     if (call == "start") frames->deliver(buffer, MediaTime{});
   };
   auto experiment = std::make_shared<QZTesselFaultExperiment>(
-      Platform{makeHandMadeCapture(stream), clock, std::make_shared<ThreadConcurrency>(),
-               std::make_shared<HandMadeReports>(handMadeChannels(1), 5)});
+      Platform{makeFakeCapture(stream), clock, std::make_shared<ThreadConcurrency>(),
+               std::make_shared<FakeReports>(fakeChannels(1), 5)});
   if (!experiment->setupWithParameters({{"frameCount", 1}, {"timeout", 1e9}}, nullptr, nullptr)) return 1;
   if (experiment->run(nullptr) == nullptr || !experiment->teardown(nullptr)) return 1;
   const std::weak_ptr<QZTesselFaultExperiment> watch = experiment;

@@ -3,7 +3,7 @@
 #include "backends/threads/thread_concurrency.h"
 #include "contract/log_channel.h"
 #include "diagnostics/projector_fault/tessel_fault_experiment.h"
-#include "tests/support/hand_made_camera.h"
+#include "tests/support/fake_camera.h"
 
 #include <gtest/gtest.h>
 
@@ -64,8 +64,8 @@ class RunWithTimeout {
       };
     }
     experiment_ = std::make_shared<QZTesselFaultExperiment>(
-        Platform{makeHandMadeCapture(stream_), std::make_shared<LastClock>(end_), std::make_shared<ThreadConcurrency>(),
-                 std::make_shared<HandMadeReports>(handMadeChannels(1), 5)});
+        Platform{makeFakeCapture(stream_), std::make_shared<LastClock>(end_), std::make_shared<ThreadConcurrency>(),
+                 std::make_shared<FakeReports>(fakeChannels(1), 5)});
     EXPECT_TRUE(experiment_->setupWithParameters({{"frameCount", 1}, {"timeout", timeout}}, nullptr, nullptr));
     const auto result = experiment_->run(nullptr);
     if (result == nullptr) {
@@ -94,8 +94,8 @@ class RunWithTimeout {
 
  private:
   const std::shared_ptr<TimeoutLog> log_ = std::make_shared<TimeoutLog>();
-  const std::shared_ptr<HandMadeStream> stream_ = std::make_shared<HandMadeStream>();
-  HandMadeBuffer buffer_;
+  const std::shared_ptr<FakeStream> stream_ = std::make_shared<FakeStream>();
+  FakePixelBuffer buffer_;
   std::promise<Moment> end_;
   std::shared_ptr<QZTesselFaultExperiment> experiment_;
 };

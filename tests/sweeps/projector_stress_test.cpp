@@ -3,7 +3,7 @@
 #include "backends/threads/real_clock.h"
 #include "backends/threads/thread_concurrency.h"
 #include "diagnostics/projector_fault/tessel_fault_experiment.h"
-#include "tests/support/hand_made_camera.h"
+#include "tests/support/fake_camera.h"
 
 #include <gtest/gtest.h>
 
@@ -71,7 +71,7 @@ class ProjectorStress : public testing::Test {
  protected:
   ProjectorStress() {
     for (auto& buffers : buffers_) {
-      for (auto& buffer : buffers) buffer = std::make_unique<HandMadeBuffer>();
+      for (auto& buffer : buffers) buffer = std::make_unique<FakePixelBuffer>();
     }
   }
   void TearDown() override {
@@ -99,7 +99,7 @@ class ProjectorStress : public testing::Test {
   // Creates an experiment, runs it and releases it at once.
   std::weak_ptr<void> runExperiment(const Round& round) {
     std::vector<std::thread> threads;
-    const auto stream = std::make_shared<HandMadeStream>();
+    const auto stream = std::make_shared<FakeStream>();
     stream->onCall = [&](std::string_view call) {
       if (call == "start") {
         for (std::size_t i = 0; i < kThreads; ++i)
@@ -112,8 +112,8 @@ class ProjectorStress : public testing::Test {
       }
     };
     auto experiment = std::make_shared<QZTesselFaultExperiment>(
-        Platform{makeHandMadeCapture(stream), std::make_shared<RealClock>(), std::make_shared<ThreadConcurrency>(),
-                 std::make_shared<HandMadeReports>(channels_, 5)});
+        Platform{makeFakeCapture(stream), std::make_shared<RealClock>(), std::make_shared<ThreadConcurrency>(),
+                 std::make_shared<FakeReports>(channels_, 5)});
     const std::weak_ptr<void> watch = experiment;
     EXPECT_TRUE(experiment->setupWithParameters({{"frameCount", round.stopCount}, {"timeout", round.timeout}}, nullptr,
                                                 nullptr));
@@ -128,7 +128,7 @@ class ProjectorStress : public testing::Test {
     return watch;
   }
 
-  void deliver(std::size_t thread, bool hasPauses, HandMadeStream& stream) {
+  void deliver(std::size_t thread, bool hasPauses, FakeStream& stream) {
     std::size_t delivered = 0;
     while (delivered < kFrames && stream.deliver(*buffers_[thread][delivered], MediaTime{})) {
       ++delivered;
@@ -174,8 +174,8 @@ class ProjectorStress : public testing::Test {
     }
   }
 
-  const HandMadeReports::Descriptions channels_ = handMadeChannels(1);
-  std::array<std::array<std::unique_ptr<HandMadeBuffer>, kFrames>, kThreads> buffers_;
+  const FakeReports::Descriptions channels_ = fakeChannels(1);
+  std::array<std::array<std::unique_ptr<FakePixelBuffer>, kFrames>, kThreads> buffers_;
   std::array<std::size_t, kThreads> delivered_{};  // written by each thread, read after the thread was joined
   StreamCalls calls_;
   std::map<std::string, int> ends_;

@@ -3,7 +3,7 @@
 
 #include "contract/diagnostic_contract.h"
 #include "contract/value.h"
-#include "tests/support/hand_made_camera.h"
+#include "tests/support/fake_camera.h"
 
 #include <chrono>
 #include <cstddef>

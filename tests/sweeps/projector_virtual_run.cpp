@@ -89,7 +89,7 @@ class PlannedCamera {
     if (!plan.countersAreRead) stream_->errorCounters.reset();
     stream_->onCall = [this](std::string_view call) { answer(call); };
     for (std::size_t i = 0; i < plan.deliveries.size(); ++i) {
-      buffers_.push_back(std::make_unique<HandMadeBuffer>(plan.deliveries[i].kind));
+      buffers_.push_back(std::make_unique<FakePixelBuffer>(plan.deliveries[i].kind));
       buffers_.back()->onRead = [this, name = "frame " + std::to_string(i)] {
         takeTime();
         transcript_.addCall("PixelBuffer.attachment", name, "MetadataDictionary", true);
@@ -97,7 +97,7 @@ class PlannedCamera {
     }
   }
 
-  const std::shared_ptr<HandMadeStream>& stream() const { return stream_; }
+  const std::shared_ptr<FakeStream>& stream() const { return stream_; }
   const std::vector<std::size_t>& delivered() const { return delivered_; }
   std::vector<int> references() const {
     std::vector<int> references;
@@ -143,8 +143,8 @@ class PlannedCamera {
   const ProjectorPlan& plan_;
   std::shared_ptr<VirtualScheduler> scheduler_;
   RunTranscript& transcript_;
-  std::shared_ptr<HandMadeStream> stream_ = std::make_shared<HandMadeStream>();
-  std::vector<std::unique_ptr<HandMadeBuffer>> buffers_;
+  std::shared_ptr<FakeStream> stream_ = std::make_shared<FakeStream>();
+  std::vector<std::unique_ptr<FakePixelBuffer>> buffers_;
   std::vector<std::size_t> delivered_;
 };
 
@@ -166,14 +166,14 @@ bool EveryOrder::toNextOrder() {
 }
 
 ProjectorRun runVirtually(const ProjectorPlan& plan, const std::shared_ptr<VirtualScheduler>& scheduler) {
-  static const HandMadeReports::Descriptions channels = handMadeChannels(1);
+  static const FakeReports::Descriptions channels = fakeChannels(1);
   const auto clock = std::make_shared<VirtualClock>(scheduler);
   RunTranscript transcript;
   PlannedCamera camera(plan, scheduler, transcript);
   auto experiment = std::make_shared<QZTesselFaultExperiment>(
-      Platform{makeHandMadeCapture(camera.stream()), clock,
+      Platform{makeFakeCapture(camera.stream()), clock,
                std::make_shared<WatchedConcurrency>(scheduler, transcript, plan.timerIsSlow),
-               std::make_shared<HandMadeReports>(channels, 5)});
+               std::make_shared<FakeReports>(channels, 5)});
   const std::weak_ptr<QZTesselFaultExperiment> watch = experiment;
 
   ProjectorRun run;

@@ -2,8 +2,8 @@
 
 #include "backends/faults/operations.h"
 #include "backends/simulated/calls/capture_error.h"
-#include "backends/simulated/scenario/report_operations.h"
-#include "backends/simulated/scenario/sensor_operations.h"
+#include "backends/simulated/calls/hid_error.h"
+#include "backends/simulated/calls/report_error.h"
 
 #include <utility>
 

@@ -1,6 +1,7 @@
 #include "backends/simulated/capture/simulated_capture.h"
 
 #include "backends/simulated/phone_for_tests.h"
+#include "tests/support/scripted_capture.h"
 
 #include <gtest/gtest.h>
 
@@ -14,16 +15,6 @@ using Code = CaptureErrorCode;
 Dictionary masterConfiguration(std::string_view port, Value slave) {
   return {{"SlaveConfigurationByPortType", Dictionary{{std::string(port), std::move(slave)}}}};
 }
-
-// A stream of another device.
-class ForeignStream final : public CaptureStream {
- public:
-  std::string description() const override { return "foreign stream"; }
-  std::optional<Value> valueForProperty(std::string_view, DiagnosticErrorPtr*) override { return std::nullopt; }
-  bool setValue(const Value&, std::string_view, DiagnosticErrorPtr*) override { return false; }
-  bool start(DiagnosticErrorPtr*) override { return false; }
-  bool stop(DiagnosticErrorPtr*) override { return false; }
-};
 
 class SimulatedGroupTest : public ::testing::Test {
  protected:
@@ -54,8 +45,8 @@ TEST_F(SimulatedGroupTest, ValuesThatDoNotFitAreRefusedAndChangeNothing) {
        "back: ActiveStreams must be an array of streams, not the number 1."},
       {"no stream", "ActiveStreams", Array{"wide"}, Code::kWrongType,
        "back: ActiveStreams must contain streams, not the string wide."},
-      {"a stream of nobody", "ActiveStreams", Array{std::make_shared<ForeignStream>()}, Code::kWrongType,
-       "back: ActiveStreams must contain streams, not foreign stream."},
+      {"a stream of nobody", "ActiveStreams", Array{std::make_shared<ScriptedStream>("foreign stream")},
+       Code::kWrongType, "back: ActiveStreams must contain streams, not foreign stream."},
       {"a stream of another group", "ActiveStreams", Array{user_.streams[2]}, Code::kForeignObject,
        "back: ActiveStreams must contain streams of the group, not stream front (FrontFacingCamera)."},
       {"a stream of another user", "ActiveStreams", Array{other.streams[0]}, Code::kForeignObject,

@@ -1,8 +1,8 @@
 #include "backends/simulated/counters/simulated_reports.h"
 
 #include "backends/counters/counter_reports.h"
+#include "backends/simulated/calls/report_error.h"
 #include "backends/simulated/capture/growth.h"
-#include "backends/simulated/scenario/report_operations.h"
 
 #include <chrono>
 #include <cstdint>

@@ -1,6 +1,7 @@
 #include "backends/counters/counters_conformance.h"
+#include "backends/faults/operations.h"
+#include "backends/simulated/calls/report_error.h"
 #include "backends/simulated/phone_for_tests.h"
-#include "backends/simulated/scenario/report_operations.h"
 
 #include <chrono>
 #include <memory>

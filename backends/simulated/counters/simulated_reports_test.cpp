@@ -1,7 +1,8 @@
 #include "backends/simulated/counters/simulated_reports.h"
 
+#include "backends/faults/operations.h"
+#include "backends/simulated/calls/report_error.h"
 #include "backends/simulated/phone_for_tests.h"
-#include "backends/simulated/scenario/report_operations.h"
 
 #include <gmock/gmock.h>
 #include <gtest/gtest.h>

@@ -1,9 +1,10 @@
 #include "backends/simulated/hid/hid_sensor.h"
 
+#include "backends/faults/hid_report_name.h"
 #include "backends/hid/hid_matching.h"
+#include "backends/simulated/calls/hid_error.h"
 #include "backends/simulated/capture/frame_delivery.h"
 #include "backends/simulated/hid/hid_image_report.h"
-#include "backends/simulated/scenario/sensor_operations.h"
 
 #include <algorithm>
 #include <utility>

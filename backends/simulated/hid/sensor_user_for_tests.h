@@ -1,9 +1,10 @@
 // A phone with a HID sensor and a user who records its inputs, for the tests of this folder.
 #pragma once
 
+#include "backends/faults/hid_report_name.h"
+#include "backends/simulated/calls/hid_error.h"
 #include "backends/simulated/scenario/hid_config.h"
 #include "backends/simulated/scenario/scenario.h"
-#include "backends/simulated/scenario/sensor_operations.h"
 #include "contract/message_format.h"
 #include "platform/platform.h"
 

@@ -1,5 +1,6 @@
 #include "backends/simulated/hid/simulated_hid.h"
 
+#include "backends/faults/operations.h"
 #include "backends/simulated/hid/sensor_user_for_tests.h"
 #include "backends/simulated/simulated_phone.h"
 #include "backends/simulated/time/simulation_stall.h"

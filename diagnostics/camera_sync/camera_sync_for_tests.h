@@ -56,9 +56,9 @@ inline Value statusEntry(Value offset, Value frames) {
 }
 
 // A device with one group of the three back cameras and the wide one as master; tests modify it.
-class FakeCaptureTest : public testing::Test {
+class ScriptedCameraSyncTest : public testing::Test {
  protected:
-  FakeCaptureTest() {
+  ScriptedCameraSyncTest() {
     device->groups = {group};
     setStatus(kWidePort, statusEntry(0, 60));
     setStatus(kTelePort, statusEntry(1, 59));

@@ -38,9 +38,9 @@ inline constexpr std::array kFrameKinds{FrameKind::kLit,
 std::string_view nameOf(FrameKind kind);
 
 // A buffer that its creator owns; it counts the references that others take. Any thread.
-class HandMadeBuffer final : public PixelBuffer {
+class FakePixelBuffer final : public PixelBuffer {
  public:
-  explicit HandMadeBuffer(FrameKind kind = FrameKind::kLit) : kind_(kind) {}
+  explicit FakePixelBuffer(FrameKind kind = FrameKind::kLit) : kind_(kind) {}
 
   void retain() override { references_.fetch_add(1); }
   void release() override { references_.fetch_sub(1); }
@@ -60,9 +60,9 @@ class HandMadeBuffer final : public PixelBuffer {
 };
 
 // The stream of the front infrared camera. It accepts every property; its test delivers frames and events.
-class HandMadeStream final : public CaptureStream {
+class FakeStream final : public CaptureStream {
  public:
-  HandMadeStream();
+  FakeStream();
 
   // Results of its calls; set them before the stream is used.
   bool stops = true;  // false: stop() fails and the stream keeps running
@@ -97,18 +97,18 @@ class HandMadeStream final : public CaptureStream {
   int handlers_ = 0;      // the number of running handlers; guarded by mutex_
 };
 
-// The default error counters of a HandMadeStream: all six, from I2C 1 to projector 6.
-const Dictionary& handMadeErrorCounters();
+// The default error counters of a FakeStream: all six, from I2C 1 to projector 6.
+const Dictionary& fakeErrorCounters();
 
 // A capture service, plug-in and device with only this stream.
-std::shared_ptr<CaptureService> makeHandMadeCapture(std::shared_ptr<HandMadeStream> stream);
+std::shared_ptr<CaptureService> makeFakeCapture(std::shared_ptr<FakeStream> stream);
 
 // Report channels whose counters all increase by `growth` between two snapshots. Any thread.
-class HandMadeReports final : public ReportFacility {
+class FakeReports final : public ReportFacility {
  public:
   using Descriptions = std::vector<std::shared_ptr<const ReportChannelDescription>>;
 
-  HandMadeReports(Descriptions channels, std::uint64_t growth)
+  FakeReports(Descriptions channels, std::uint64_t growth)
       : channels_(std::make_shared<const Descriptions>(std::move(channels))), growth_(growth) {}
 
   std::shared_ptr<const ReportChannelSet> reportWithOnlySimpleChannels(DiagnosticErrorPtr* error) override;
@@ -119,6 +119,6 @@ class HandMadeReports final : public ReportFacility {
 };
 
 // `count` channels "Channel 0", "Channel 1" and so on of the fault report, each followed by one of another subgroup.
-HandMadeReports::Descriptions handMadeChannels(std::size_t count);
+FakeReports::Descriptions fakeChannels(std::size_t count);
 
 }  // namespace quazor

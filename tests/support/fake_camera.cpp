@@ -1,4 +1,4 @@
-#include "tests/support/hand_made_camera.h"
+#include "tests/support/fake_camera.h"
 
 #include "platform/capture_keys.h"
 #include "tests/support/scripted_capture.h"
@@ -58,9 +58,9 @@ std::optional<Value> metadataOf(FrameKind kind) {
 }
 
 // All channels have the same count.
-class HandMadeSnapshot final : public ReportSnapshot {
+class FakeSnapshot final : public ReportSnapshot {
  public:
-  HandMadeSnapshot(std::shared_ptr<const HandMadeReports::Descriptions> channels, std::uint64_t count)
+  FakeSnapshot(std::shared_ptr<const FakeReports::Descriptions> channels, std::uint64_t count)
       : channels_(std::move(channels)) {
     samples_.reserve(channels_->size());
     for (const auto& channel : *channels_) samples_.emplace_back(ReportChannel(channel, count));
@@ -69,7 +69,7 @@ class HandMadeSnapshot final : public ReportSnapshot {
   const std::vector<ReportSample>& samples() const override { return samples_; }
   std::shared_ptr<const ReportSnapshot> snapshotWithBaseline(const ReportSnapshot& baseline,
                                                              DiagnosticErrorPtr*) const override {
-    return std::make_shared<HandMadeSnapshot>(channels_, samples_.empty() ? 0 : countOf(*this) - countOf(baseline));
+    return std::make_shared<FakeSnapshot>(channels_, samples_.empty() ? 0 : countOf(*this) - countOf(baseline));
   }
 
  private:
@@ -77,28 +77,28 @@ class HandMadeSnapshot final : public ReportSnapshot {
     return toUnsigned(pointerTo(snapshot.samples().front().channel().count()));
   }
 
-  std::shared_ptr<const HandMadeReports::Descriptions> channels_;
+  std::shared_ptr<const FakeReports::Descriptions> channels_;
   std::vector<ReportSample> samples_;
 };
 
-class HandMadeChannelSet final : public ReportChannelSet {
+class FakeChannelSet final : public ReportChannelSet {
  public:
-  HandMadeChannelSet(std::shared_ptr<const HandMadeReports::Descriptions> channels, std::uint64_t growth)
+  FakeChannelSet(std::shared_ptr<const FakeReports::Descriptions> channels, std::uint64_t growth)
       : channels_(std::move(channels)), growth_(growth) {}
 
   std::shared_ptr<const ReportChannelSet> reportByFilteringChannels(const Predicate& keep) const override {
-    auto kept = std::make_shared<HandMadeReports::Descriptions>();
+    auto kept = std::make_shared<FakeReports::Descriptions>();
     for (const auto& channel : *channels_) {
       if (keep(*channel)) kept->push_back(channel);
     }
-    return std::make_shared<HandMadeChannelSet>(std::move(kept), growth_);
+    return std::make_shared<FakeChannelSet>(std::move(kept), growth_);
   }
   std::shared_ptr<const ReportSnapshot> snapshot(DiagnosticErrorPtr*) const override {
-    return std::make_shared<HandMadeSnapshot>(channels_, growth_ * snapshots_.fetch_add(1));
+    return std::make_shared<FakeSnapshot>(channels_, growth_ * snapshots_.fetch_add(1));
   }
 
  private:
-  std::shared_ptr<const HandMadeReports::Descriptions> channels_;
+  std::shared_ptr<const FakeReports::Descriptions> channels_;
   std::uint64_t growth_;
   mutable std::atomic<std::uint64_t> snapshots_{0};
 };
@@ -117,26 +117,26 @@ std::string_view nameOf(FrameKind kind) {
   return "of no known kind";
 }
 
-std::optional<Value> HandMadeBuffer::attachment(std::string_view key) const {
+std::optional<Value> FakePixelBuffer::attachment(std::string_view key) const {
   if (onRead) onRead();
   return key == capture_key::MetadataDictionary ? metadataOf(kind_) : std::nullopt;
 }
 
-void HandMadeBuffer::renew(FrameKind kind) {
+void FakePixelBuffer::renew(FrameKind kind) {
   kind_ = kind;
   references_.store(0);
 }
 
-HandMadeStream::HandMadeStream() : errorCounters(handMadeErrorCounters()) {}
+FakeStream::FakeStream() : errorCounters(fakeErrorCounters()) {}
 
-std::optional<Value> HandMadeStream::valueForProperty(std::string_view key, DiagnosticErrorPtr*) {
+std::optional<Value> FakeStream::valueForProperty(std::string_view key, DiagnosticErrorPtr*) {
   if (key == capture_key::PortType) return Value(port_type::FrontFacingInfraredCamera);
   if (key != capture_key::ErrorCounters) return std::nullopt;
   if (onCall) onCall("get ErrorCounters");
   return errorCounters;
 }
 
-bool HandMadeStream::setValue(const Value& value, std::string_view key, DiagnosticErrorPtr*) {
+bool FakeStream::setValue(const Value& value, std::string_view key, DiagnosticErrorPtr*) {
   if (key == capture_key::VideoOutputHandlers) {
     const Value* handlers = entryOf(&value, capture_key::PrimaryScaler);
     frames_ =
@@ -146,7 +146,7 @@ bool HandMadeStream::setValue(const Value& value, std::string_view key, Diagnost
   return true;
 }
 
-bool HandMadeStream::start(DiagnosticErrorPtr*) {
+bool FakeStream::start(DiagnosticErrorPtr*) {
   {
     const std::lock_guard lock(mutex_);
     running_ = true;
@@ -155,7 +155,7 @@ bool HandMadeStream::start(DiagnosticErrorPtr*) {
   return true;
 }
 
-bool HandMadeStream::stop(DiagnosticErrorPtr*) {
+bool FakeStream::stop(DiagnosticErrorPtr*) {
   if (onCall) onCall("stop");
   if (stops) {
     std::unique_lock lock(mutex_);
@@ -166,55 +166,55 @@ bool HandMadeStream::stop(DiagnosticErrorPtr*) {
   return stops;
 }
 
-bool HandMadeStream::deliver(PixelBuffer& buffer, MediaTime time) {
+bool FakeStream::deliver(PixelBuffer& buffer, MediaTime time) {
   if (!enter()) return false;
   (*frames_)(buffer, time);
   leave();
   return true;
 }
 
-bool HandMadeStream::deliverEvent(std::int32_t event, MediaTime time) {
+bool FakeStream::deliverEvent(std::int32_t event, MediaTime time) {
   if (!enter()) return false;
   (*events_)(event, time, nullptr);
   leave();
   return true;
 }
 
-bool HandMadeStream::enter() {
+bool FakeStream::enter() {
   const std::lock_guard lock(mutex_);
   if (running_) ++handlers_;
   return running_;
 }
 
-void HandMadeStream::leave() {
+void FakeStream::leave() {
   const std::lock_guard lock(mutex_);
   if (--handlers_ == 0) left_.notify_all();
 }
 
-const Dictionary& handMadeErrorCounters() {
+const Dictionary& fakeErrorCounters() {
   static const Dictionary counters{{"I2CErrorCount", 1},  {"MIPIErrorCount", 2}, {"LPDPErrorCount", 3},
                                    {"UARTErrorCount", 4}, {"SIFErrorCount", 5},  {"ProjectorErrorCount", 6}};
   return counters;
 }
 
-std::shared_ptr<CaptureService> makeHandMadeCapture(std::shared_ptr<HandMadeStream> stream) {
+std::shared_ptr<CaptureService> makeFakeCapture(std::shared_ptr<FakeStream> stream) {
   auto device = std::make_shared<ScriptedDevice>("device");
   device->members = CaptureStreams{std::move(stream)};
   return std::make_shared<ScriptedCapture>(std::move(device));
 }
 
-std::shared_ptr<const ReportChannelSet> HandMadeReports::reportWithOnlySimpleChannels(DiagnosticErrorPtr*) {
-  return std::make_shared<HandMadeChannelSet>(channels_, growth_);
+std::shared_ptr<const ReportChannelSet> FakeReports::reportWithOnlySimpleChannels(DiagnosticErrorPtr*) {
+  return std::make_shared<FakeChannelSet>(channels_, growth_);
 }
 
-HandMadeReports::Descriptions handMadeChannels(std::size_t count) {
+FakeReports::Descriptions fakeChannels(std::size_t count) {
   // One allocation that the pointers to all descriptions share.
   const auto descriptions = std::make_shared<std::vector<ReportChannelDescription>>();
   for (std::size_t i = 0; i < count; ++i) {
     const std::string name = "Channel " + std::to_string(i);
     for (const char* subGroup : {"K42ISP Events", "Other Events"}) descriptions->push_back({"K42ISP", subGroup, name});
   }
-  HandMadeReports::Descriptions channels;
+  FakeReports::Descriptions channels;
   channels.reserve(descriptions->size());
   for (const ReportChannelDescription& description : *descriptions) channels.emplace_back(descriptions, &description);
   return channels;

@@ -1,8 +1,6 @@
 // The errors of the simulated report facility.
 #pragma once
 
-#include "backends/faults/operations.h"
-
 #include <cstdint>
 #include <string_view>
 

@@ -1,4 +1,4 @@
-#include "tests/support/hand_made_sensor.h"
+#include "tests/support/fake_sensor.h"
 
 #include "contract/message_format.h"
 
@@ -43,7 +43,7 @@ void removeFrom(List& list, const std::shared_ptr<T>& item, std::string_view mod
 
 }  // namespace
 
-class HandMadeRunLoop::Source final : public RunLoopSource {
+class FakeRunLoop::Source final : public RunLoopSource {
  public:
   explicit Source(std::function<void()> handler) : handler_(std::move(handler)) {}
 
@@ -61,7 +61,7 @@ class HandMadeRunLoop::Source final : public RunLoopSource {
   bool signalled_ = false;
 };
 
-class HandMadeRunLoop::Observer final : public RunLoopObserver {
+class FakeRunLoop::Observer final : public RunLoopObserver {
  public:
   Observer(RunLoopActivities mask, bool isRepeating, std::int64_t place, std::function<void(RunLoopActivities)> called)
       : activities(mask), repeats(isRepeating), order(place), handler(std::move(called)) {}
@@ -72,21 +72,21 @@ class HandMadeRunLoop::Observer final : public RunLoopObserver {
   const std::function<void(RunLoopActivities)> handler;
 };
 
-std::shared_ptr<RunLoopSource> HandMadeRunLoop::makeSource(std::function<void()> handler) {
+std::shared_ptr<RunLoopSource> FakeRunLoop::makeSource(std::function<void()> handler) {
   return std::make_shared<Source>(std::move(handler));
 }
 
-void HandMadeRunLoop::addSource(const std::shared_ptr<RunLoopSource>& source, std::string_view mode) {
+void FakeRunLoop::addSource(const std::shared_ptr<RunLoopSource>& source, std::string_view mode) {
   addTo(sources_, source, mode);
 }
 
-void HandMadeRunLoop::removeSource(const std::shared_ptr<RunLoopSource>& source, std::string_view mode) {
+void FakeRunLoop::removeSource(const std::shared_ptr<RunLoopSource>& source, std::string_view mode) {
   removeFrom(sources_, source, mode);
 }
 
-std::shared_ptr<RunLoopObserver> HandMadeRunLoop::makeObserver(RunLoopActivities activities, bool repeats,
-                                                               std::int64_t order,
-                                                               std::function<void(RunLoopActivities)> handler) {
+std::shared_ptr<RunLoopObserver> FakeRunLoop::makeObserver(RunLoopActivities activities, bool repeats,
+                                                           std::int64_t order,
+                                                           std::function<void(RunLoopActivities)> handler) {
   auto observer = std::make_shared<Observer>(activities, repeats, order, std::move(handler));
   lastObserver_ = observer;
   if (record_) {
@@ -98,7 +98,7 @@ std::shared_ptr<RunLoopObserver> HandMadeRunLoop::makeObserver(RunLoopActivities
   return observer;
 }
 
-void HandMadeRunLoop::addObserver(const std::shared_ptr<RunLoopObserver>& observer, std::string_view mode) {
+void FakeRunLoop::addObserver(const std::shared_ptr<RunLoopObserver>& observer, std::string_view mode) {
   if (record_) record_("RunLoop.addObserver", "loop", mode, true);
   addTo(observers_, observer, mode);
   std::stable_sort(observers_.begin(), observers_.end(), [](const auto& a, const auto& b) {
@@ -106,13 +106,13 @@ void HandMadeRunLoop::addObserver(const std::shared_ptr<RunLoopObserver>& observ
   });
 }
 
-void HandMadeRunLoop::removeObserver(const std::shared_ptr<RunLoopObserver>& observer, std::string_view mode) {
+void FakeRunLoop::removeObserver(const std::shared_ptr<RunLoopObserver>& observer, std::string_view mode) {
   if (record_) record_("RunLoop.removeObserver", "loop", mode, isAdded(observers_, observer));
   removeFrom(observers_, observer, mode);
 }
 
-RunLoopResult HandMadeRunLoop::runInMode(std::string_view mode, std::chrono::nanoseconds limit,
-                                         bool returnAfterSourceHandled) {
+RunLoopResult FakeRunLoop::runInMode(std::string_view mode, std::chrono::nanoseconds limit,
+                                     bool returnAfterSourceHandled) {
   if (record_) {
     record_("RunLoop.runInMode", "loop",
             std::string(mode) + ' ' + std::to_string(limit.count()) + " ns" +
@@ -130,8 +130,8 @@ RunLoopResult HandMadeRunLoop::runInMode(std::string_view mode, std::chrono::nan
   return result;
 }
 
-RunLoopResult HandMadeRunLoop::runRounds(std::string_view mode, std::chrono::nanoseconds deadline,
-                                         bool returnAfterSourceHandled) {
+RunLoopResult FakeRunLoop::runRounds(std::string_view mode, std::chrono::nanoseconds deadline,
+                                     bool returnAfterSourceHandled) {
   while (true) {
     const bool signalled = std::any_of(sources_.begin(), sources_.end(), [&](const auto& added) {
       return takesPartIn(mode, added.second) && static_cast<const Source&>(*added.first).isSignalled();
@@ -150,7 +150,7 @@ RunLoopResult HandMadeRunLoop::runRounds(std::string_view mode, std::chrono::nan
   }
 }
 
-bool HandMadeRunLoop::handleSources(std::string_view mode) {
+bool FakeRunLoop::handleSources(std::string_view mode) {
   bool handled = false;
   const Added<RunLoopSource> sources = sources_;  // handlers may change the list
   for (const auto& [source, addedMode] : sources) {
@@ -160,7 +160,7 @@ bool HandMadeRunLoop::handleSources(std::string_view mode) {
   return handled;
 }
 
-void HandMadeRunLoop::tell(RunLoopActivities activity, std::string_view mode) {
+void FakeRunLoop::tell(RunLoopActivities activity, std::string_view mode) {
   const Added<RunLoopObserver> observers = observers_;  // handlers may change the list
   for (const auto& [added, addedMode] : observers) {
     const auto& observer = static_cast<const Observer&>(*added);
@@ -171,7 +171,7 @@ void HandMadeRunLoop::tell(RunLoopActivities activity, std::string_view mode) {
 }
 
 // Performs all actions for one time in one wait, so that their sources are handled in one round.
-void HandMadeRunLoop::waitUntil(std::chrono::nanoseconds deadline) {
+void FakeRunLoop::waitUntil(std::chrono::nanoseconds deadline) {
   if (actions_.empty() || actions_.begin()->first > deadline) {
     now_ = deadline;
     return;
@@ -184,66 +184,66 @@ void HandMadeRunLoop::waitUntil(std::chrono::nanoseconds deadline) {
   }
 }
 
-void HandMadeRunLoop::stop() {
+void FakeRunLoop::stop() {
   if (record_) record_("RunLoop.stop", "loop", "", true);
   stopped_ = true;
 }
 
-void HandMadeHidDevice::record(std::string_view operation, std::string_view detail, bool succeeded) const {
+void FakeHidDevice::record(std::string_view operation, std::string_view detail, bool succeeded) const {
   if (record_) record_("HidDevice." + std::string(operation), "sensor", detail, succeeded);
 }
 
-bool HandMadeHidDevice::answer(bool succeeded, DiagnosticErrorPtr* error) const {
+bool FakeHidDevice::answer(bool succeeded, DiagnosticErrorPtr* error) const {
   if (!succeeded && ownError != nullptr) storeError(error, ownError);
   return succeeded;
 }
 
-bool HandMadeHidDevice::open(DiagnosticErrorPtr* error) {
+bool FakeHidDevice::open(DiagnosticErrorPtr* error) {
   record("open", "", opens);
   open_ = opens;
   return answer(opens, error);
 }
 
-void HandMadeHidDevice::setInputReportCallback(InputReportCallback callback) {
+void FakeHidDevice::setInputReportCallback(InputReportCallback callback) {
   record(callback ? "setInputReportCallback" : "removeInputReportCallback", "", true);
   receiver_ = callback ? std::make_shared<InputReportCallback>(std::move(callback)) : nullptr;
 }
 
-bool HandMadeHidDevice::setFeatureReportWithID(std::uint8_t reportID, std::span<const std::uint8_t> payload,
-                                               DiagnosticErrorPtr* error) {
+bool FakeHidDevice::setFeatureReportWithID(std::uint8_t reportID, std::span<const std::uint8_t> payload,
+                                           DiagnosticErrorPtr* error) {
   const bool taken = !refusedReports.contains(reportID);
   if (record_) record("setFeatureReport", std::to_string(reportID) + " = " + hexadecimal(payload), taken);
   if (taken && onFeatureReport) onFeatureReport(reportID);
   return answer(taken, error);
 }
 
-void HandMadeHidDevice::scheduleWithRunLoop(RunLoop& runLoop, std::string_view mode) {
+void FakeHidDevice::scheduleWithRunLoop(RunLoop& runLoop, std::string_view mode) {
   record("schedule", mode, true);
   loop_ = &runLoop;
   source_ = runLoop.makeSource([this] { deliverAll(); });
   runLoop.addSource(source_, mode);
 }
 
-void HandMadeHidDevice::unscheduleFromRunLoop(RunLoop& runLoop, std::string_view mode) {
+void FakeHidDevice::unscheduleFromRunLoop(RunLoop& runLoop, std::string_view mode) {
   record("unschedule", mode, true);
   if (loop_ != &runLoop) return;
   runLoop.removeSource(source_, mode);
   loop_ = nullptr;
 }
 
-void HandMadeHidDevice::close(std::uint32_t options) {
+void FakeHidDevice::close(std::uint32_t options) {
   if (record_) record("close", std::to_string(options), true);
   open_ = false;
   currentError_ = nullptr;
 }
 
-void HandMadeHidDevice::enqueue(Event event) {
+void FakeHidDevice::enqueue(Event event) {
   if (!listens()) return;
   events_.push_back(std::move(event));
   if (source_ != nullptr) source_->signal();
 }
 
-void HandMadeHidDevice::deliverAll() {
+void FakeHidDevice::deliverAll() {
   while (!events_.empty()) {
     const Event event = std::move(events_.front());
     events_.pop_front();
@@ -255,13 +255,13 @@ void HandMadeHidDevice::deliverAll() {
   }
 }
 
-void HandMadeHidDevice::deliver(std::uint8_t reportID, std::span<const std::uint8_t> data) {
+void FakeHidDevice::deliver(std::uint8_t reportID, std::span<const std::uint8_t> data) {
   if (!listens()) return;
   const std::shared_ptr<InputReportCallback> receiver = receiver_;
   (*receiver)(reportID, data, nullptr);
 }
 
-void HandMadeHidDevice::deliverError(DiagnosticErrorPtr error) {
+void FakeHidDevice::deliverError(DiagnosticErrorPtr error) {
   if (!listens()) return;
   const std::shared_ptr<InputReportCallback> receiver = receiver_;
   currentError_ = std::move(error);
@@ -269,12 +269,9 @@ void HandMadeHidDevice::deliverError(DiagnosticErrorPtr error) {
 }
 
 // One object that implements all services for a sensor.
-class HandMadeSensor::Services final : public HidService,
-                                       public FramebufferService,
-                                       public RunLoops,
-                                       public Concurrency {
+class FakeSensor::Services final : public HidService, public FramebufferService, public RunLoops, public Concurrency {
  public:
-  explicit Services(HandMadeSensor& sensor) : sensor_(sensor) {}
+  explicit Services(FakeSensor& sensor) : sensor_(sensor) {}
 
   std::shared_ptr<HidManager> createManager() override {
     record("HidService.createManager", "hid", "", sensor_.hasHidManager);
@@ -300,7 +297,7 @@ class HandMadeSensor::Services final : public HidService,
  private:
   class Manager final : public HidManager {
    public:
-    explicit Manager(HandMadeSensor& sensor) : sensor_(sensor) {}
+    explicit Manager(FakeSensor& sensor) : sensor_(sensor) {}
     std::string description() const override { return "manager"; }
     void enumerateDevicesMatching(const std::vector<Dictionary>& wanted) override {
       sensor_.matching = wanted;
@@ -313,12 +310,12 @@ class HandMadeSensor::Services final : public HidService,
     }
 
    private:
-    HandMadeSensor& sensor_;
+    FakeSensor& sensor_;
   };
 
   class Registry final : public RegistryService {
    public:
-    explicit Registry(HandMadeSensor& sensor) : sensor_(sensor) {}
+    explicit Registry(FakeSensor& sensor) : sensor_(sensor) {}
     std::string description() const override { return "registry"; }
     std::optional<Value> registryProperty(std::string_view name) override {
       const bool isThere = name == "DSPLY Debug Info" && sensor_.displayProperty;
@@ -327,12 +324,12 @@ class HandMadeSensor::Services final : public HidService,
     }
 
    private:
-    HandMadeSensor& sensor_;
+    FakeSensor& sensor_;
   };
 
   class MainDisplay final : public Display {
    public:
-    explicit MainDisplay(HandMadeSensor& sensor) : sensor_(sensor) {}
+    explicit MainDisplay(FakeSensor& sensor) : sensor_(sensor) {}
     std::string description() const override { return "display"; }
     std::shared_ptr<RegistryService> registryService() override {
       sensor_.record_("Display.registryService", "display", "", sensor_.hasRegistryService);
@@ -340,34 +337,34 @@ class HandMadeSensor::Services final : public HidService,
     }
 
    private:
-    HandMadeSensor& sensor_;
+    FakeSensor& sensor_;
   };
 
   class RecordedSemaphore final : public Semaphore {
    public:
-    explicit RecordedSemaphore(HandMadeSensor& sensor) : sensor_(sensor) {}
+    explicit RecordedSemaphore(FakeSensor& sensor) : sensor_(sensor) {}
     void signal() override { sensor_.record_("Semaphore.signal", "semaphore", "", true); }
     void wait() override { sensor_.record_("Semaphore.wait", "semaphore", "", true); }
 
    private:
-    HandMadeSensor& sensor_;
+    FakeSensor& sensor_;
   };
 
   void record(std::string_view operation, std::string_view object, std::string_view detail, bool succeeded) const {
     sensor_.record_(operation, object, detail, succeeded);
   }
 
-  HandMadeSensor& sensor_;
+  FakeSensor& sensor_;
 };
 
-HandMadeSensor::HandMadeSensor(CallRecorder record)
+FakeSensor::FakeSensor(CallRecorder record)
     : displayProperty(displayPropertyOf(1)),
       loop(record),
-      device(std::make_shared<HandMadeHidDevice>(record)),
+      device(std::make_shared<FakeHidDevice>(record)),
       matchingDevices{device},
       record_(record ? std::move(record) : [](std::string_view, std::string_view, std::string_view, bool) {}) {}
 
-Platform HandMadeSensor::platform() {
+Platform FakeSensor::platform() {
   const auto services = std::make_shared<Services>(*this);
   return Platform{nullptr, nullptr, services, nullptr, services, services, services};
 }

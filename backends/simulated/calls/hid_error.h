@@ -1,8 +1,6 @@
 // The errors of the simulated HID devices.
 #pragma once
 
-#include "backends/faults/hid_report_name.h"
-#include "backends/faults/operations.h"
 #include "contract/diagnostic_error.h"
 
 #include <cstdint>

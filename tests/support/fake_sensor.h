@@ -24,9 +24,9 @@ using CallRecorder =
     std::function<void(std::string_view operation, std::string_view object, std::string_view detail, bool succeeded)>;
 
 // A loop with its own time, which advances only while the loop waits. Tests schedule the events in advance.
-class HandMadeRunLoop final : public RunLoop {
+class FakeRunLoop final : public RunLoop {
  public:
-  explicit HandMadeRunLoop(CallRecorder record) : record_(std::move(record)) {}
+  explicit FakeRunLoop(CallRecorder record) : record_(std::move(record)) {}
 
   // Calls `action` when the loop waits at that time or later; actions for equal times run in the order of the calls.
   void at(std::chrono::nanoseconds time, std::function<void()> action) { actions_.emplace(time, std::move(action)); }
@@ -69,9 +69,9 @@ class HandMadeRunLoop final : public RunLoop {
 };
 
 // A device that accepts everything except what it is told to refuse.
-class HandMadeHidDevice final : public HidDevice {
+class FakeHidDevice final : public HidDevice {
  public:
-  explicit HandMadeHidDevice(CallRecorder record) : record_(std::move(record)) {}
+  explicit FakeHidDevice(CallRecorder record) : record_(std::move(record)) {}
 
   // Results of its calls; set them before it is used.
   bool opens = true;
@@ -124,9 +124,9 @@ class HandMadeHidDevice final : public HidDevice {
 };
 
 // All services for the sensor image experiment. Changes affect later calls.
-class HandMadeSensor {
+class FakeSensor {
  public:
-  explicit HandMadeSensor(CallRecorder record);
+  explicit FakeSensor(CallRecorder record);
 
   // The services borrow the sensor, which must outlive them.
   Platform platform();
@@ -136,8 +136,8 @@ class HandMadeSensor {
   std::optional<Value> displayProperty;  // "DSPLY Debug Info"; initially that of a powered display
   bool hasHidManager = true;
   bool hasRunLoop = true;
-  HandMadeRunLoop loop;
-  std::shared_ptr<HandMadeHidDevice> device;
+  FakeRunLoop loop;
+  std::shared_ptr<FakeHidDevice> device;
   std::vector<std::shared_ptr<HidDevice>> matchingDevices;  // initially the one device
   std::vector<Dictionary> matching;                         // the last search
 
