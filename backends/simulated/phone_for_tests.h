@@ -1,7 +1,7 @@
 // A small scenario, and a user of its capture device, for the tests of this folder.
 #pragma once
 
-#include "backends/simulated/calls/capture_error.h"
+#include "backends/simulated/errors/capture_error.h"
 #include "backends/simulated/simulated_phone.h"
 #include "platform/capture_service.h"
 

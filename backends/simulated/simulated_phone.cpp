@@ -1,10 +1,10 @@
 #include "backends/simulated/simulated_phone.h"
 
 #include "backends/faults/intercepted_platform.h"
-#include "backends/simulated/calls/injected_error.h"
 #include "backends/simulated/capture/simulated_capture.h"
 #include "backends/simulated/counters/simulated_reports.h"
 #include "backends/simulated/display/simulated_framebuffer.h"
+#include "backends/simulated/errors/injected_error.h"
 #include "backends/simulated/hid/simulated_hid.h"
 #include "backends/simulated/time/virtual_run_loop.h"
 #include "backends/simulated/time/virtual_services.h"

@@ -1,6 +1,6 @@
 #include "backends/simulated/capture/simulated_camera.h"
 
-#include "backends/simulated/calls/capture_error.h"
+#include "backends/simulated/errors/capture_error.h"
 #include "platform/capture_keys.h"
 
 #include <utility>

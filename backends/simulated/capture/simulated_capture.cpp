@@ -1,8 +1,8 @@
 #include "backends/simulated/capture/simulated_capture.h"
 
 #include "backends/capture/checked_capture.h"
-#include "backends/simulated/calls/capture_error.h"
 #include "backends/simulated/capture/simulated_camera.h"
+#include "backends/simulated/errors/capture_error.h"
 
 #include <stdexcept>
 #include <string>

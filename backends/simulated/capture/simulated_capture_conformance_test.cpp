@@ -1,5 +1,5 @@
 #include "backends/capture/capture_session_conformance.h"
-#include "backends/simulated/calls/capture_error.h"
+#include "backends/simulated/errors/capture_error.h"
 #include "backends/simulated/simulated_phone.h"
 
 namespace quazor {

@@ -1,8 +1,8 @@
 #include "backends/simulated/counters/simulated_reports.h"
 
 #include "backends/counters/counter_reports.h"
-#include "backends/simulated/calls/report_error.h"
 #include "backends/simulated/capture/growth.h"
+#include "backends/simulated/errors/report_error.h"
 
 #include <chrono>
 #include <cstdint>

@@ -1,6 +1,6 @@
 #include "backends/counters/counters_conformance.h"
 #include "backends/faults/operations.h"
-#include "backends/simulated/calls/report_error.h"
+#include "backends/simulated/errors/report_error.h"
 #include "backends/simulated/phone_for_tests.h"
 
 #include <chrono>

@@ -1,7 +1,7 @@
 #include "backends/simulated/counters/simulated_reports.h"
 
 #include "backends/faults/operations.h"
-#include "backends/simulated/calls/report_error.h"
+#include "backends/simulated/errors/report_error.h"
 #include "backends/simulated/phone_for_tests.h"
 
 #include <gmock/gmock.h>

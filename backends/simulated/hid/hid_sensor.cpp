@@ -2,8 +2,8 @@
 
 #include "backends/faults/hid_report_name.h"
 #include "backends/hid/hid_matching.h"
-#include "backends/simulated/calls/hid_error.h"
 #include "backends/simulated/capture/frame_delivery.h"
+#include "backends/simulated/errors/hid_error.h"
 #include "backends/simulated/hid/hid_image_report.h"
 
 #include <algorithm>

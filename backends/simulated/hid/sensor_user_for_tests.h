@@ -2,7 +2,7 @@
 #pragma once
 
 #include "backends/faults/hid_report_name.h"
-#include "backends/simulated/calls/hid_error.h"
+#include "backends/simulated/errors/hid_error.h"
 #include "backends/simulated/scenario/hid_config.h"
 #include "backends/simulated/scenario/scenario.h"
 #include "contract/message_format.h"

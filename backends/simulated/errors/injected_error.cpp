@@ -1,9 +1,9 @@
-#include "backends/simulated/calls/injected_error.h"
+#include "backends/simulated/errors/injected_error.h"
 
 #include "backends/faults/operations.h"
-#include "backends/simulated/calls/capture_error.h"
-#include "backends/simulated/calls/hid_error.h"
-#include "backends/simulated/calls/report_error.h"
+#include "backends/simulated/errors/capture_error.h"
+#include "backends/simulated/errors/hid_error.h"
+#include "backends/simulated/errors/report_error.h"
 
 #include <utility>
 
