@@ -155,9 +155,9 @@ Json diagnosisJson(const JudgedResult& judged, bool known) {
 }
 
 // Writes the test run of one record.
-class RecordWriter {
+class OcpRecordWriter {
  public:
-  RecordWriter(std::string& out, const RunStarted& run, const DiagnosticRecord& record)
+  OcpRecordWriter(std::string& out, const RunStarted& run, const DiagnosticRecord& record)
       : run_(run), record_(record), stream_(out, record.log, record.begin) {}
 
   // Returns the date of the last line.
@@ -282,7 +282,7 @@ std::string ocpReport(const RunStarted& run, const std::vector<DiagnosticRecord>
                       const std::optional<std::string>& interrupted) {
   std::string report;
   Date end = run.date;
-  for (const DiagnosticRecord& record : records) end = RecordWriter(report, run, record).write();
+  for (const DiagnosticRecord& record : records) end = OcpRecordWriter(report, run, record).write();
   const UnrecordedDiagnostics unrecorded = unrecordedDiagnosticsOf(run, records, interrupted);
   const std::vector<LogLine> noLog;
   if (unrecorded.interrupted) {

@@ -60,7 +60,6 @@ class FrameDelivery final : public std::enable_shared_from_this<FrameDelivery> {
   // Passes the next `count` frames to the handler immediately, on this thread; they are numbered from 0, independently
   // of the regular frames. For tests. Returns the number of delivered frames: fewer if the delivery is closed in the
   // meantime, 0 without a handler.
-  // delivery is closed meanwhile, or 0 without a handler.
   std::uint64_t push(std::uint64_t count);
 
  private:
