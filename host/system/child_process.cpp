@@ -1,5 +1,7 @@
 #include "host/system/child_process.h"
 
+#include "host/system/file_size_limit.h"
+
 #include <dirent.h>
 #include <fcntl.h>
 #include <linux/close_range.h>
@@ -21,6 +23,7 @@
 #include <fstream>
 #include <system_error>
 #include <thread>
+#include <utility>
 
 namespace quazor {
 
@@ -49,17 +52,27 @@ sigset_t watchedSet() {
   return set;
 }
 
-struct Pipe {
-  int readEnd = -1;
-  int writeEnd = -1;
-};
+// A pipe from the child; reading does not block. Closes the ends that it still has.
+// Thread: the one that made it.
+class Pipe {
+ public:
+  Pipe() {
+    if (::pipe2(ends_, O_CLOEXEC) != 0) refuse("making a pipe");
+    ::fcntl(ends_[0], F_SETFL, O_NONBLOCK);
+  }
+  Pipe(const Pipe&) = delete;
+  Pipe& operator=(const Pipe&) = delete;
+  ~Pipe() {
+    if (ends_[0] >= 0) ::close(ends_[0]);
+    ::close(ends_[1]);
+  }
 
-Pipe makePipe() {
-  int ends[2] = {};
-  if (::pipe2(ends, O_CLOEXEC) != 0) refuse("making a pipe");
-  ::fcntl(ends[0], F_SETFL, O_NONBLOCK);
-  return {ends[0], ends[1]};
-}
+  int writeEnd() const { return ends_[1]; }
+  int takeReadEnd() { return std::exchange(ends_[0], -1); }
+
+ private:
+  int ends_[2] = {-1, -1};
+};
 
 // The child processes of this process (proc(5), /proc/PID/stat, field 4).
 std::vector<pid_t> childrenOfThisProcess() {
@@ -103,10 +116,10 @@ int becomeChild(pid_t parent, const WatchedSignals& signals, const Pipe& connect
   if (::getppid() != parent) ::_exit(EXIT_FAILURE);  // the parent ended before the call above
   const int nothing = ::open("/dev/null", O_RDONLY | O_CLOEXEC);
   ::dup2(nothing, STDIN_FILENO);
-  ::dup2(output.writeEnd, STDOUT_FILENO);
-  ::dup2(output.writeEnd, STDERR_FILENO);
+  ::dup2(output.writeEnd(), STDOUT_FILENO);
+  ::dup2(output.writeEnd(), STDERR_FILENO);
   const int number = numberOfConnection();
-  ::dup3(connection.writeEnd, number, O_CLOEXEC);
+  ::dup3(connection.writeEnd(), number, O_CLOEXEC);
   ::syscall(SYS_close_range, 3, number - 1, 0);
   ::syscall(SYS_close_range, number + 1, ~0U, 0);
   if (memory) {
@@ -114,6 +127,7 @@ int becomeChild(pid_t parent, const WatchedSignals& signals, const Pipe& connect
     ::setrlimit(RLIMIT_AS, &limit);
   }
   signals.restore();
+  restoreFileSizeSignal();
   return number;
 }
 
@@ -164,8 +178,8 @@ void WatchedSignals::restore() const {
 ChildProcess::ChildProcess(const WatchedSignals& signals, const std::function<void(int)>& body,
                            std::optional<std::uint64_t> memory, IsCleanupProcess isCleanupProcess)
     : isCleanupProcess_(isCleanupProcess), others_(childrenOfThisProcess()) {
-  const Pipe connection = makePipe();
-  const Pipe output = makePipe();
+  Pipe connection;
+  Pipe output;
   const pid_t parent = ::getpid();
   std::fflush(nullptr);
   id_ = ::fork();
@@ -175,10 +189,8 @@ ChildProcess::ChildProcess(const WatchedSignals& signals, const std::function<vo
     ::_exit(EXIT_SUCCESS);
   }
   ::setpgid(id_, id_);  // both parent and child call this; the first call takes effect
-  ::close(connection.writeEnd);
-  ::close(output.writeEnd);
-  connection_ = connection.readEnd;
-  output_ = output.readEnd;
+  connection_ = connection.takeReadEnd();
+  output_ = output.takeReadEnd();
 }
 
 ChildProcess::~ChildProcess() {
