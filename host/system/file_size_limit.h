@@ -3,8 +3,8 @@
 
 namespace quazor {
 
-// From now on such a write fails with EFBIG, like one to a full disk. By default SIGXFSZ ends the process, and with it the
-// run and its reports.
+// From now on such a write fails with EFBIG, like one to a full disk. By default SIGXFSZ ends the process, and with it
+// the run and its reports.
 void failWritesBeyondFileSizeLimit();
 
 // Undoes it in a new child: a plug-in finds the signal as quazor found it.
