@@ -108,10 +108,17 @@ int numberOfConnection() {
   return static_cast<int>(std::min<rlim_t>(kConnection, limit.rlim_cur - 1));
 }
 
+// What PR_GET_DUMPABLE told when it was first asked for.
+int isParentDumpable() {
+  static const int dumpable = ::prctl(PR_GET_DUMPABLE);
+  return dumpable;
+}
+
 // Returns the descriptor of the child's end of the connection.
 int becomeChild(pid_t parent, const WatchedSignals& signals, const Pipe& connection, const Pipe& output,
                 std::optional<std::uint64_t> memory) {
-  ::setpgid(0, 0);
+  ::setsid();  // a terminal of its parent is not its own
+  ::prctl(PR_SET_DUMPABLE, isParentDumpable());
   ::prctl(PR_SET_PDEATHSIG, SIGKILL);
   if (::getppid() != parent) ::_exit(EXIT_FAILURE);  // the parent ended before the call above
   const int nothing = ::open("/dev/null", O_RDONLY | O_CLOEXEC);
@@ -182,13 +189,15 @@ ChildProcess::ChildProcess(const WatchedSignals& signals, const std::function<vo
   Pipe output;
   const pid_t parent = ::getpid();
   std::fflush(nullptr);
+  // From now on other processes of the user, such as the child, may neither trace this one nor open its descriptors.
+  isParentDumpable();
+  ::prctl(PR_SET_DUMPABLE, 0);
   id_ = ::fork();
   if (id_ < 0) refuse("making a process");
   if (id_ == 0) {
     doWork(body, becomeChild(parent, signals, connection, output, memory));
     ::_exit(EXIT_SUCCESS);
   }
-  ::setpgid(id_, id_);  // both parent and child call this; the first call takes effect
   connection_ = connection.takeReadEnd();
   output_ = output.takeReadEnd();
 }
@@ -220,6 +229,15 @@ const std::optional<ProcessEnd>& ChildProcess::end() {
     end_ = ProcessEnd{info.si_code != CLD_EXITED, info.si_status};
   }
   return end_;
+}
+
+void ChildProcess::reapOrphans() const {
+  siginfo_t info{};
+  while (::waitid(P_ALL, 0, &info, WEXITED | WNOHANG | WNOWAIT) == 0 && info.si_pid > 0 && info.si_pid != id_) {
+    if (std::find(others_.begin(), others_.end(), info.si_pid) != others_.end()) return;
+    ::waitpid(info.si_pid, nullptr, WNOHANG);
+    info = {};
+  }
 }
 
 void ChildProcess::signalGroup(int signal) const {
