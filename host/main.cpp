@@ -2,6 +2,8 @@
 #include "host/cli/installation.h"
 #include "host/command/commands.h"
 #include "host/error/exit_code.h"
+#include "host/system/file_size_limit.h"
+#include "host/system/standard_descriptors.h"
 
 #include <langinfo.h>
 #include <locale.h>
@@ -37,6 +39,8 @@ bool writesUtf8() {
 
 int main(int argc, char** argv) {
   try {
+    quazor::openStandardDescriptors();
+    quazor::failWritesBeyondFileSizeLimit();
     quazor::Console console{std::cout, std::cerr, wantsColour(), isatty(STDERR_FILENO) == 1, writesUtf8()};
     const std::vector<std::string> arguments(argv + (argc > 0 ? 1 : 0), argv + argc);
     return static_cast<int>(quazor::runProgram(arguments, quazor::Installation::ofThisProgram(), console));

@@ -4,6 +4,8 @@ function(quazor_add_plugin name)
   target_link_libraries(${name} PRIVATE quazor::quazor)
   # A plug-in hides its symbols and links everything it uses, so that undefined symbols are linker errors.
   target_link_options(${name} PRIVATE -Wl,--no-undefined)
+  # The run path is the installation's from the start: CMake pads one that it will replace with empty entries, and the
+  # linker takes those for the working directory.
   set_target_properties(${name} PROPERTIES PREFIX "" CXX_EXTENSIONS OFF CXX_VISIBILITY_PRESET hidden
-                        VISIBILITY_INLINES_HIDDEN ON INSTALL_RPATH "$ORIGIN/..")
+                        VISIBILITY_INLINES_HIDDEN ON INSTALL_RPATH "$ORIGIN/.." BUILD_WITH_INSTALL_RPATH ON)
 endfunction()

@@ -46,10 +46,11 @@ bool holdsString(const std::optional<Value>& list, std::string_view text) {
          });
 }
 
-// A numeric entry of a status; 0 if it is not a number.
-Value numberIn(const Dictionary& status, std::string_view key) {
+// An entry of a status: nothing if it is absent, 0 if it is not a number.
+std::optional<Value> numberIn(const Dictionary& status, std::string_view key) {
   const Value* number = status.find(key);
-  return number != nullptr && number->isNumber() ? *number : Value(0);
+  if (number == nullptr) return std::nullopt;
+  return number->isNumber() ? *number : Value(0);
 }
 
 }  // namespace
@@ -245,17 +246,17 @@ std::optional<CameraReport> CameraSession::report(std::size_t position, const Va
          "No error counters for port %@!", port);
     return std::nullopt;
   }
-  const Value offset = numberIn(*portStatus, capture_key::Offset);
-  Value frames = numberIn(*portStatus, capture_key::FrameCount);
-  if (toSigned(&frames) < 0) {
+  std::optional<Value> offset = numberIn(*portStatus, capture_key::Offset);
+  std::optional<Value> frames = numberIn(*portStatus, capture_key::FrameCount);
+  if (toSigned(pointerTo(frames)) < 0) {
     logError("%@ did not record any frames!", port);
     countsAreValid = false;
     frames = Value(0);
   }
-  const std::uint64_t total = toUnsigned(&offset) + toUnsigned(&frames);
+  const std::uint64_t total = toUnsigned(pointerTo(offset)) + toUnsigned(pointerTo(frames));
   logDefault("%@%@\n  Offset: %@\n  Frames: %@\n  Total: %@\n  ErrorCounters: %@\n", port,
              std::string_view(position == 0 ? " <-- sync master" : ""), offset, frames, total, *counters);
-  return CameraReport{offset, std::move(frames), std::move(*counters)};
+  return CameraReport{std::move(offset), std::move(frames), std::move(*counters)};
 }
 
 void CameraSession::finish() {

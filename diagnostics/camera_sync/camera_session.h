@@ -23,10 +23,11 @@ inline constexpr std::int64_t kNotSynchronized = 214;
 inline constexpr std::int64_t kNoSessionStatus = 215;
 }  // namespace camera_sync_error
 
-// The session result of one camera. Offset and frames keep the numeric type of the session status.
+// The session result of one camera. Offset and frames keep the numeric type of the session status; those that it lacks
+// are measured as 0.
 struct CameraReport {
-  Value offset;
-  Value frames;
+  std::optional<Value> offset;
+  std::optional<Value> frames;
   Value errorCounters;
 };
 

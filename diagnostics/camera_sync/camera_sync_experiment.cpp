@@ -26,8 +26,9 @@ std::unique_ptr<QZExperimentResult> buildResult(const std::vector<std::string>& 
     if (!camera) continue;
     const QZUnit& frames = QZDimensionlessUnit::frames();
     result->measurements().set(cameraKey(*camera, kFrameOffsetQuantity),
-                               Measurement(toDouble(&reports[i].offset), frames));
-    result->measurements().set(cameraKey(*camera, kFramesQuantity), Measurement(toDouble(&reports[i].frames), frames));
+                               Measurement(toDouble(pointerTo(reports[i].offset)), frames));
+    result->measurements().set(cameraKey(*camera, kFramesQuantity),
+                               Measurement(toDouble(pointerTo(reports[i].frames)), frames));
     errorCounters.set(*camera, reports[i].errorCounters);
   }
   result->auxiliaryData().set(capture_key::ErrorCounters, std::move(errorCounters));

@@ -38,9 +38,9 @@ TEST_F(CameraSyncExperimentEdges, ReadsTheNumbersOfAStatusEntryByTheRulesOfValue
        "18446744073709551616", "2"},
       {"a negative offset wraps in the total alone", statusEntry(-3, 1), reportLine("-3", "1", "18446744073709551614"),
        "-3", "1"},
-      {"no numbers", Dictionary(), reportLine("0", "0", "0"), "0", "0"},
-      {"no offset", Dictionary{{"FrameCount", 57}}, reportLine("0", "57", "57"), "0", "57"},
-      {"no frame count", Dictionary{{"Offset", 3}}, reportLine("3", "0", "3"), "3", "0"},
+      {"no numbers", Dictionary(), reportLine("(null)", "(null)", "0"), "0", "0"},
+      {"no offset", Dictionary{{"FrameCount", 57}}, reportLine("(null)", "57", "57"), "0", "57"},
+      {"no frame count", Dictionary{{"Offset", 3}}, reportLine("3", "(null)", "3"), "3", "0"},
       {"strings are no numbers", statusEntry("3", "57"), reportLine("0", "0", "0"), "0", "0"},
   };
   for (const auto& row : rows) {

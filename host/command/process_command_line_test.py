@@ -181,6 +181,16 @@ class ProcessTest(CommandLineTest):
         result = self.run_fake(preexec_fn=lambda: resource.setrlimit(resource.RLIMIT_NOFILE, (64, 64)))
         self.assertEqual(result.returncode, 0, result.stdout + result.stderr)
 
+    def test_a_missing_standard_descriptor_is_not_taken_by_a_file(self):
+        # What cannot be shown on standard output is told by the exit code.
+        for descriptor, code in {0: 0, 1: 73, 2: 0}.items():
+            with self.subTest(descriptor):
+                record = self.directory / f"{descriptor}.jsonl"
+                result = self.run_fake("--record", record, preexec_fn=lambda: os.close(descriptor))
+                self.assertEqual([event["sequence"] for event in events_in(record)][0], 0)
+                self.assert_verifies(record)
+                self.assertEqual(result.returncode, code, result.stdout + result.stderr)
+
 
 class InterruptTest(CommandLineTest):
     NAMES = ("Broken.Nothing", "Fake.One", "Fake.Two")

@@ -3,6 +3,7 @@
 import json
 import pathlib
 import random
+import resource
 import unittest
 import xml.etree.ElementTree
 
@@ -75,8 +76,21 @@ class MakingTest(RecordTest):
 
     def test_a_record_that_turns_out_not_to_be_writable_is_an_error(self):
         result = self.run_fake("--record", "/dev/full")
-        self.assertEqual(result.returncode, 2)
+        self.assertEqual(result.returncode, 73)
         self.assertIn("QuazorHostErrorDomain code 10: the record '/dev/full' cannot be written", result.stdout)
+        self.assertIn("quazor: the record '/dev/full' cannot be written: No space left on device", result.stderr)
+
+    def test_a_limit_on_file_sizes_is_an_error_and_not_the_end(self):
+        # Room for the first lines of the record, and for the whole report.
+        limit = 1000
+        record = self.directory / "run.jsonl"
+        result = self.run_fake("--record", record,
+                               preexec_fn=lambda: resource.setrlimit(resource.RLIMIT_FSIZE, (limit, limit)))
+        self.assertEqual(result.returncode, 73, result.stderr)
+        self.assertIn(f"quazor: the record '{record}' cannot be written: File too large", result.stderr)
+        self.assertIn("code 10: the record", result.stdout)
+        self.assertIn("ERROR", result.stdout)
+        self.assertEqual(record.stat().st_size, limit)
 
     def test_a_file_is_not_written_twice(self):
         one = self.write("one", "precious")

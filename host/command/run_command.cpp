@@ -140,6 +140,7 @@ ExitCode perform(const Options& options, const Installation& installation, Conso
     }
   }
   events.onEvent(RunEnded{std::nullopt, dateNow()});
+  events.requireRecords();
   return events.exitCode();
 }
 
@@ -153,6 +154,7 @@ ExitCode performNothing(const Options& options, const Installation& installation
   began.phone = options.phone.string();
   events.onEvent(std::move(began));
   events.onEvent(RunEnded{std::nullopt, dateNow()});
+  events.requireRecords();
   return events.exitCode();
 }
 

@@ -16,11 +16,14 @@ std::string_view nameOf(LogLevel level) {
   return "debug";
 }
 
+thread_local const RunLog* RunLog::ownerOfThisThread = nullptr;
+
 RunLog::RunLog(std::shared_ptr<const Clock> clock, RunEventSink& events)
     : clock_(std::move(clock)), begin_(clock_->now()), events_(&events) {}
 
 void RunLog::write(LogLevel level, std::string_view /*subsystem*/, std::string_view /*category*/,
                    std::string_view text) {
+  if (ownerOfThisThread != nullptr && ownerOfThisThread != this) return;
   const std::lock_guard lock(mutex_);
   if (events_ != nullptr) events_->onEvent(Logged{{clock_->now() - begin_, level, std::string(text), dateNow()}});
 }

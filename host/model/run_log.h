@@ -10,6 +10,7 @@
 #include <mutex>
 #include <string>
 #include <string_view>
+#include <utility>
 
 namespace quazor {
 
@@ -24,7 +25,7 @@ struct LogLine {
   Date date{};  // by the wall clock
 };
 
-// Sends every log line as an event until it is closed.
+// Sends every log line as an event until it is closed, except those of other runs' tasks.
 // Thread: any.
 class RunLog final : public LogBackend {
  public:
@@ -36,7 +37,23 @@ class RunLog final : public LogBackend {
   // Lines written after this are dropped.
   void close();
 
+  // While it lives, only `log` takes the lines of the calling thread: a task that is late for its own run does not
+  // write into the log of the next.
+  // Thread: the one that made it.
+  class Owner {
+   public:
+    explicit Owner(const RunLog& log) : before_(std::exchange(ownerOfThisThread, &log)) {}
+    Owner(const Owner&) = delete;
+    Owner& operator=(const Owner&) = delete;
+    ~Owner() { ownerOfThisThread = before_; }
+
+   private:
+    const RunLog* const before_;
+  };
+
  private:
+  static thread_local const RunLog* ownerOfThisThread;  // null: any log takes the thread's lines
+
   const std::shared_ptr<const Clock> clock_;
   const std::chrono::nanoseconds begin_;
   std::mutex mutex_;      // held while the sink takes a line

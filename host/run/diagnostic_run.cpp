@@ -3,6 +3,7 @@
 #include "host/error/host_error.h"
 #include "host/model/run_log.h"
 #include "host/plugin/null_platform.h"
+#include "host/run/run_concurrency.h"
 #include "host/text/timestamp.h"
 
 #include <algorithm>
@@ -50,6 +51,8 @@ class LogOfRun {
     sharedLog().setBackend(nullptr, level_);
     log_->close();
   }
+
+  std::shared_ptr<const RunLog> log() const { return log_; }
 
  private:
   const std::shared_ptr<RunLog> log_;
@@ -194,9 +197,10 @@ void runDiagnostic(const Diagnostic& diagnostic, const ResolvedParameters& param
   OneAtATime serial(events);
   const std::shared_ptr<const Phone> phone = options.makePhone();
   if (options.watchPhone) options.watchPhone(phone);
-  const Platform platform = phone->platform();
+  Platform platform = phone->platform();
   {
     const LogOfRun log(platform.clock, options.logLevel, serial);
+    platform.concurrency = concurrencyOfRun(std::move(platform.concurrency), log.log());
     installPlatform(platform);
     Run run(diagnostic, parameters, *platform.clock, serial);
     const std::unique_ptr<QZExperimentResult> result = run.experiment();

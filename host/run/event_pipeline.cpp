@@ -27,6 +27,10 @@ std::unique_ptr<RecordWriter> lastRunRecord() {
   }
 }
 
+std::string problemOf(const RecordWriter& record) {
+  return "the record '" + record.file().string() + "' cannot be written: " + record.problem();
+}
+
 }  // namespace
 
 EventPipeline::EventPipeline(const EventPipelineOptions& options, Console& console) : report_(options.report, console) {
@@ -67,10 +71,15 @@ void EventPipeline::endOpenDiagnostic() {
   for (std::size_t i = 0; i < required_; ++i) {
     const RecordWriter& record = *records_[i];
     if (record.problem().empty()) continue;
-    pass(Failed{std::nullopt, hostError(HostErrorCode::kNotRecorded, "the record '" + record.file().string() +
-                                                                         "' cannot be written: " + record.problem())});
+    pass(Failed{std::nullopt, hostError(HostErrorCode::kNotRecorded, problemOf(record))});
   }
   for (const RunEvent& event : builder_.ending(dateNow())) pass(event);
+}
+
+void EventPipeline::requireRecords() const {
+  for (std::size_t i = 0; i < required_; ++i) {
+    if (!records_[i]->problem().empty()) throw CommandError(ExitCode::kCannotWrite, problemOf(*records_[i]));
+  }
 }
 
 void EventPipeline::interruptRun() {

@@ -43,6 +43,8 @@ class EventPipeline final : public RunEventSink {
   void interruptAndLeave(const std::function<void()>& leave);
 
   ExitCode exitCode() const { return report_.exitCode(); }
+  // Throws a CommandError (kCannotWrite) if a requested record is incomplete.
+  void requireRecords() const;
   Progress& progress() { return report_.progress(); }
 
  private:

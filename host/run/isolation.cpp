@@ -20,6 +20,7 @@
 #include <cstddef>
 #include <cstdlib>
 #include <string_view>
+#include <system_error>
 #include <thread>
 #include <utility>
 
@@ -419,9 +420,14 @@ bool runIsolated(const IsolationOptions& options, WatchedSignals& signals, const
   };
   IsolatedRun run(diagnostic, deadlines, progress, events);
   Supervised end;
-  {
+  try {
     ChildProcess child(signals, body, options.memory, isCleanupProcess);
     end = supervise(child, signals, run.supervision());
+  } catch (const std::system_error& problem) {
+    events.onEvent(Failed{Stage::kLoad,
+                          hostError(HostErrorCode::kNoProcess,
+                                    "the process of " + diagnostic.name + " could not be created: " + problem.what())});
+    return true;
   }
   run.conclude(end);
   return end.how != SupervisionEnd::kInterrupted;

@@ -13,6 +13,7 @@
 
 #include <gmock/gmock.h>
 #include <gtest/gtest.h>
+#include <sys/resource.h>
 #include <unistd.h>
 
 #include <algorithm>
@@ -242,6 +243,30 @@ class RunTest : public IsolationTest {
   bool goesOn_ = false;
   bool isCompleted_ = false;
 };
+
+// The number that the next descriptor gets.
+rlim_t nextDescriptor() {
+  const int next = ::dup(STDIN_FILENO);
+  ::close(next);
+  return static_cast<rlim_t>(next);
+}
+
+TEST_F(RunTest, EndsInAnErrorWhereNoProcessCanBeMade) {
+  const rlim_t next = nextDescriptor();
+  rlimit before{};
+  ASSERT_EQ(::getrlimit(RLIMIT_NOFILE, &before), 0);
+  const rlimit few{next + 3, before.rlim_max};  // enough for one pipe, not for two
+  ASSERT_EQ(::setrlimit(RLIMIT_NOFILE, &few), 0);
+  const DiagnosticRecord record = run("working", "Fake.One", {"duration=2"});
+  ASSERT_EQ(::setrlimit(RLIMIT_NOFILE, &before), 0);
+  EXPECT_TRUE(goesOn_);
+  EXPECT_EQ(record.verdict, Verdict::kError);
+  EXPECT_EQ(defaultText(record.error),
+            "QuazorHostErrorDomain code 12: the process of Fake.One could not be created: "
+            "making a pipe: Too many open files");
+  EXPECT_EQ(nextDescriptor(), next);
+  EXPECT_EQ(run("working", "Fake.One", {"duration=2", "measured=90", "minimum=90"}).verdict, Verdict::kPass);
+}
 
 TEST_F(RunTest, TellsWhatARunInThisProcessWouldTell) {
   const DiagnosticRecord record = run("working", "Fake.One", {"duration=2", "measured=90", "minimum=90"});

@@ -1,5 +1,7 @@
 #include "host/system/child_process.h"
 
+#include "host/system/file_size_limit.h"
+
 #include <dirent.h>
 #include <fcntl.h>
 #include <linux/close_range.h>
@@ -21,6 +23,7 @@
 #include <fstream>
 #include <system_error>
 #include <thread>
+#include <utility>
 
 namespace quazor {
 
@@ -49,17 +52,27 @@ sigset_t watchedSet() {
   return set;
 }
 
-struct Pipe {
-  int readEnd = -1;
-  int writeEnd = -1;
-};
+// A pipe from the child; reading does not block. Closes the ends that it still has.
+// Thread: the one that made it.
+class Pipe {
+ public:
+  Pipe() {
+    if (::pipe2(ends_, O_CLOEXEC) != 0) refuse("making a pipe");
+    ::fcntl(ends_[0], F_SETFL, O_NONBLOCK);
+  }
+  Pipe(const Pipe&) = delete;
+  Pipe& operator=(const Pipe&) = delete;
+  ~Pipe() {
+    if (ends_[0] >= 0) ::close(ends_[0]);
+    ::close(ends_[1]);
+  }
 
-Pipe makePipe() {
-  int ends[2] = {};
-  if (::pipe2(ends, O_CLOEXEC) != 0) refuse("making a pipe");
-  ::fcntl(ends[0], F_SETFL, O_NONBLOCK);
-  return {ends[0], ends[1]};
-}
+  int writeEnd() const { return ends_[1]; }
+  int takeReadEnd() { return std::exchange(ends_[0], -1); }
+
+ private:
+  int ends_[2] = {-1, -1};
+};
 
 // The child processes of this process (proc(5), /proc/PID/stat, field 4).
 std::vector<pid_t> childrenOfThisProcess() {
@@ -95,18 +108,25 @@ int numberOfConnection() {
   return static_cast<int>(std::min<rlim_t>(kConnection, limit.rlim_cur - 1));
 }
 
+// What PR_GET_DUMPABLE told when it was first asked for.
+int isParentDumpable() {
+  static const int dumpable = ::prctl(PR_GET_DUMPABLE);
+  return dumpable;
+}
+
 // Returns the descriptor of the child's end of the connection.
 int becomeChild(pid_t parent, const WatchedSignals& signals, const Pipe& connection, const Pipe& output,
                 std::optional<std::uint64_t> memory) {
-  ::setpgid(0, 0);
+  ::setsid();  // a terminal of its parent is not its own
+  ::prctl(PR_SET_DUMPABLE, isParentDumpable());
   ::prctl(PR_SET_PDEATHSIG, SIGKILL);
   if (::getppid() != parent) ::_exit(EXIT_FAILURE);  // the parent ended before the call above
   const int nothing = ::open("/dev/null", O_RDONLY | O_CLOEXEC);
   ::dup2(nothing, STDIN_FILENO);
-  ::dup2(output.writeEnd, STDOUT_FILENO);
-  ::dup2(output.writeEnd, STDERR_FILENO);
+  ::dup2(output.writeEnd(), STDOUT_FILENO);
+  ::dup2(output.writeEnd(), STDERR_FILENO);
   const int number = numberOfConnection();
-  ::dup3(connection.writeEnd, number, O_CLOEXEC);
+  ::dup3(connection.writeEnd(), number, O_CLOEXEC);
   ::syscall(SYS_close_range, 3, number - 1, 0);
   ::syscall(SYS_close_range, number + 1, ~0U, 0);
   if (memory) {
@@ -114,6 +134,7 @@ int becomeChild(pid_t parent, const WatchedSignals& signals, const Pipe& connect
     ::setrlimit(RLIMIT_AS, &limit);
   }
   signals.restore();
+  restoreFileSizeSignal();
   return number;
 }
 
@@ -164,21 +185,21 @@ void WatchedSignals::restore() const {
 ChildProcess::ChildProcess(const WatchedSignals& signals, const std::function<void(int)>& body,
                            std::optional<std::uint64_t> memory, IsCleanupProcess isCleanupProcess)
     : isCleanupProcess_(isCleanupProcess), others_(childrenOfThisProcess()) {
-  const Pipe connection = makePipe();
-  const Pipe output = makePipe();
+  Pipe connection;
+  Pipe output;
   const pid_t parent = ::getpid();
   std::fflush(nullptr);
+  // From now on other processes of the user, such as the child, may neither trace this one nor open its descriptors.
+  isParentDumpable();
+  ::prctl(PR_SET_DUMPABLE, 0);
   id_ = ::fork();
   if (id_ < 0) refuse("making a process");
   if (id_ == 0) {
     doWork(body, becomeChild(parent, signals, connection, output, memory));
     ::_exit(EXIT_SUCCESS);
   }
-  ::setpgid(id_, id_);  // both parent and child call this; the first call takes effect
-  ::close(connection.writeEnd);
-  ::close(output.writeEnd);
-  connection_ = connection.readEnd;
-  output_ = output.readEnd;
+  connection_ = connection.takeReadEnd();
+  output_ = output.takeReadEnd();
 }
 
 ChildProcess::~ChildProcess() {
@@ -208,6 +229,15 @@ const std::optional<ProcessEnd>& ChildProcess::end() {
     end_ = ProcessEnd{info.si_code != CLD_EXITED, info.si_status};
   }
   return end_;
+}
+
+void ChildProcess::reapOrphans() const {
+  siginfo_t info{};
+  while (::waitid(P_ALL, 0, &info, WEXITED | WNOHANG | WNOWAIT) == 0 && info.si_pid > 0 && info.si_pid != id_) {
+    if (std::find(others_.begin(), others_.end(), info.si_pid) != others_.end()) return;
+    ::waitpid(info.si_pid, nullptr, WNOHANG);
+    info = {};
+  }
 }
 
 void ChildProcess::signalGroup(int signal) const {

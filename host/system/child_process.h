@@ -50,8 +50,9 @@ class WatchedSignals {
   int requestsToEnd_ = 0;
 };
 
-// A child in its own process group. It inherits only the descriptor of its connection; its standard input is empty, and
-// its standard output and standard error go to outputDescriptor().
+// A child in its own session, without a terminal. It inherits only the descriptor of its connection; its standard input
+// is empty, and its standard output and standard error go to outputDescriptor(). The process that makes one is not
+// dumpable from then on.
 //
 // Thread: the one that made it, and no other thread may be there when it is made.
 class ChildProcess {
@@ -76,6 +77,10 @@ class ChildProcess {
 
   // How the child ended, or nothing if it has not. Does not block.
   const std::optional<ProcessEnd>& end();
+
+  // Reaps the descendants of the child that have ended and whose parents have ended before. Until then each takes up a
+  // process ID of the user.
+  void reapOrphans() const;
 
   // Sends the signal to the child and its whole group, and continues them if they were stopped.
   void signalGroup(int signal) const;

@@ -8,6 +8,7 @@
 #include <gmock/gmock.h>
 #include <gtest/gtest.h>
 #include <poll.h>
+#include <sys/prctl.h>
 #include <sys/resource.h>
 #include <sys/wait.h>
 #include <unistd.h>
@@ -154,6 +155,21 @@ TEST_F(ChildProcessTest, IsTheFirstOfItsOwnGroupWithTheSignalsAsTheyWere) {
   ChildProcess child(signals_, body, std::nullopt);
   EXPECT_EQ(readAll(child.connectionDescriptor()), "yes");
   EXPECT_GT(child.id(), 0);
+}
+
+TEST_F(ChildProcessTest, HasASessionOfItsOwn) {
+  ChildProcess child(
+      signals_, [](int connection) { say(connection, ::getsid(0) == ::getpid() ? "yes" : "no"); }, std::nullopt);
+  EXPECT_EQ(readAll(child.connectionDescriptor()), "yes");
+}
+
+TEST_F(ChildProcessTest, CannotTraceItsParentButMayBeTraced) {
+  const auto body = [](int connection) { say(connection, ::prctl(PR_GET_DUMPABLE) == 1 ? "yes" : "no"); };
+  for (int i = 0; i < 2; ++i) {
+    ChildProcess child(signals_, body, std::nullopt);
+    EXPECT_EQ(readAll(child.connectionDescriptor()), "yes");
+    EXPECT_EQ(::prctl(PR_GET_DUMPABLE), 0);
+  }
 }
 
 TEST_F(ChildProcessTest, HasAsMuchMemoryAsItIsGiven) {

@@ -104,6 +104,7 @@ class Supervisor {
     while (!child_.end() && !gaveUp_) {
       wait();
       signals_.drain();
+      child_.reapOrphans();
       readAll();
       decide();
     }

@@ -5,6 +5,7 @@
 
 #include <gmock/gmock.h>
 #include <gtest/gtest.h>
+#include <sys/wait.h>
 #include <unistd.h>
 
 #include <ctime>
@@ -24,7 +25,7 @@ class SupervisionTest : public testing::Test {
   SupervisionTest() {
     supervision_.takeLine = [this](std::string_view line) {
       lines_.emplace_back(line);
-      if (line == "ready") deadline_ = steady_clock::now() + 30ms;
+      if (line == "ready" || line == "looked") deadline_ = steady_clock::now() + 30ms;
       if (line == "interrupt") ::kill(::getpid(), SIGINT);
       return line != "garbage";
     };
@@ -308,6 +309,34 @@ TEST_F(SupervisionTest, DoesNotWaitForWhatTheChildLeavesBehind) {
             }),
             "ended, exit code 0");
   EXPECT_LT(took_, 10s);
+}
+
+TEST_F(SupervisionTest, ReapsOrphansOfTheChildWhileItRuns) {
+  int seen = 0;  // how often a zombie was there after all had ended
+  const auto tickOfBase = supervision_.tick;
+  supervision_.tick = [&] {
+    tickOfBase();
+    if (lines_.empty() || lines_.back() != "all have ended") return;
+    siginfo_t info{};
+    if (::waitid(P_ALL, 0, &info, WEXITED | WNOHANG | WNOWAIT) == 0 && info.si_pid != 0) ++seen;
+  };
+  EXPECT_EQ(run([](int connection) {
+              for (int i = 0; i < 20; ++i) {
+                const pid_t parent = ::fork();
+                if (parent == 0) {
+                  if (::fork() == 0) ::usleep(1000);  // ends as an orphan
+                  ::_exit(0);
+                }
+                ::waitpid(parent, nullptr, 0);
+              }
+              ::usleep(300'000);
+              say(connection, "all have ended\n");
+              ::usleep(300'000);
+              say(connection, "looked\n");
+              hang();
+            }).substr(0, 8),
+            "deadline");
+  EXPECT_EQ(seen, 0);
 }
 
 TEST_F(SupervisionTest, NeedsNoTick) {

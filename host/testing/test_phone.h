@@ -21,7 +21,7 @@ class ManualClock final : public Clock {
 };
 
 // A phone with only a clock. It reports that one fault fired three times and that 17 frames were delivered.
-class TestPhone final : public Phone {
+class TestPhone : public Phone {
  public:
   Platform platform() const override {
     Platform platform = nullPlatform();
