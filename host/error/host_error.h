@@ -27,6 +27,7 @@ enum class HostErrorCode : std::int64_t {
   kConnectionLost = 9,   // the plug-in's process closed or overwrote its connection to quazor
   kNotRecorded = 10,     // the record of the run could not be written
   kInterrupted = 11,     // the user interrupted the run
+  kTooDeep = 12,         // the plug-in gave a value that is nested too deeply to be recorded
 };
 
 DiagnosticErrorPtr hostError(HostErrorCode code, std::string message);
