@@ -1,5 +1,7 @@
 #include "contract/diagnostic_error.h"
 
+#include "contract/flat_destruction.h"
+
 #include <optional>
 #include <utility>
 #include <vector>
@@ -9,6 +11,8 @@ namespace QUAZOR_CONTRACT {
 // cppcheck-suppress uninitMemberVar  // all are, below
 DiagnosticError::DiagnosticError(std::string_view domain, std::int64_t code, Dictionary userInfo)
     : domain_(domain), code_(code), userInfo_(std::move(userInfo)) {}
+
+DiagnosticError::~DiagnosticError() { destroyFlat(std::move(userInfo_)); }
 
 std::string DiagnosticError::localizedDescription() const {
   const Value* message = userInfo_.find(localizedDescriptionKey);

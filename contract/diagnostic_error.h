@@ -31,6 +31,10 @@ inline constexpr std::string_view underlyingErrorKey = "underlying-error";      
 class QUAZOR_EXPORT DiagnosticError {
  public:
   DiagnosticError(std::string_view domain, std::int64_t code, Dictionary userInfo);
+  DiagnosticError(const DiagnosticError&) = default;
+  DiagnosticError& operator=(const DiagnosticError&) = default;
+  // Does not recurse, because a chain of errors may be long.
+  ~DiagnosticError();
 
   const std::string& domain() const { return domain_; }
   std::int64_t code() const { return code_; }

@@ -6,7 +6,9 @@
 #include <gtest/gtest.h>
 
 #include <limits>
+#include <memory>
 #include <string>
+#include <utility>
 #include <vector>
 
 namespace quazor {
@@ -112,6 +114,36 @@ TEST(ErrorWithMessageTest, HasAnUnderlyingEntryOnlyForAnError) {
   EXPECT_THAT(keysOf(with->userInfo()), ElementsAre("localized-description", "underlying-error"));
   const auto without = errorWithMessage("Lamp", 2, "Dark.", nullptr);
   EXPECT_THAT(keysOf(without->userInfo()), ElementsAre("localized-description"));
+}
+
+DiagnosticErrorPtr chainOf(int errors) {
+  DiagnosticErrorPtr chain;
+  for (int i = 0; i < errors; ++i) chain = errorWithMessage("Bus", i, "stalled", std::move(chain));
+  return chain;
+}
+
+TEST(DiagnosticErrorTest, AChainOfAnyLengthIsPrintedAndDestroyed) {
+  constexpr int kErrors = 120'000;
+  DiagnosticErrorPtr chain = chainOf(kErrors);
+  EXPECT_EQ(formatMessage("%@", chain), "Bus code 119999: stalled");
+  Dictionary representation = chain->dictionaryRepresentation();
+  EXPECT_EQ(*representation.find("code"), Value(kErrors - 1));
+  int length = 0;
+  for (DiagnosticErrorPtr one = chain; one != nullptr; one = one->underlyingError()) ++length;
+  EXPECT_EQ(length, kErrors);
+  const std::weak_ptr<const DiagnosticError> inner = chain->underlyingError()->underlyingError();
+  chain = nullptr;
+  EXPECT_TRUE(inner.expired());
+  representation = {};
+}
+
+TEST(DiagnosticErrorTest, TheEndOfAChainLeavesWhatOthersHold) {
+  DiagnosticErrorPtr chain = chainOf(10);
+  const DiagnosticErrorPtr held = chain->underlyingError();
+  chain = nullptr;
+  EXPECT_EQ(held->code(), 8);
+  ASSERT_NE(held->underlyingError(), nullptr);
+  EXPECT_EQ(held->underlyingError()->code(), 7);
 }
 
 TEST(StoreErrorTest, StoresWhereThereIsAPlaceAndNowhereElse) {

@@ -1,17 +1,43 @@
 #include "contract/value.h"
 
+#include "contract/flat_destruction.h"
+
 #include <cmath>
 #include <limits>
+#include <memory>
+#include <utility>
 
 namespace QUAZOR_CONTRACT {
+
+namespace {
+
+// The content of a Value, which ends without recursion.
+template <class Content>
+struct Holder {
+  explicit Holder(Content&& taken) : content(std::move(taken)) {}
+  Holder(const Holder&) = delete;
+  Holder& operator=(const Holder&) = delete;
+  ~Holder() { destroyFlat(std::move(content)); }
+
+  Content content;
+};
+
+template <class Content>
+std::shared_ptr<const Content> held(Content&& content) {
+  auto holder = std::make_shared<Holder<Content>>(std::move(content));
+  const Content* const place = &holder->content;
+  return {std::move(holder), place};
+}
+
+}  // namespace
 
 Object::~Object() = default;
 
 Value::Value(std::string text) : data_(std::make_shared<const std::string>(std::move(text))) {}
 Value::Value(std::string_view text) : Value(std::string(text)) {}
 Value::Value(const char* text) : Value(std::string(text)) {}
-Value::Value(Array elements) : data_(std::make_shared<const Array>(std::move(elements))) {}
-Value::Value(Dictionary entries) : data_(std::make_shared<const Dictionary>(std::move(entries))) {}
+Value::Value(Array elements) : data_(held(std::move(elements))) {}
+Value::Value(Dictionary entries) : data_(held(std::move(entries))) {}
 Value::Value(Bytes bytes) : data_(std::make_shared<const Bytes>(std::move(bytes))) {}
 
 std::shared_ptr<Object> Value::object() const {

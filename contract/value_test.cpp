@@ -1,13 +1,17 @@
 #include "contract/value.h"
 
+#include "contract/counting_object_for_tests.h"
 #include "contract/diagnostic_error.h"
 
 #include <gtest/gtest.h>
 
 #include <cmath>
 #include <limits>
+#include <memory>
+#include <optional>
 #include <string>
 #include <type_traits>
+#include <utility>
 
 namespace quazor {
 namespace {
@@ -281,6 +285,26 @@ TEST(PointerToTest, PointsAtWhatAnOptionalHolds) {
   const std::optional<Value> something(5);
   EXPECT_EQ(pointerTo(nothing), nullptr);
   EXPECT_EQ(pointerTo(something), &*something);
+}
+
+TEST(ValueTest, ValuesNestedToAnyDepthAreDestroyed) {
+  constexpr int kLevels = 120'000;
+  const auto object = std::make_shared<CountingObject>();
+  Value nested(object);
+  for (int i = 0; i < kLevels; ++i) {
+    if (i % 3 == 0) nested = Value(Array{1, std::move(nested), Dictionary{{"a", Array{}}}});
+    if (i % 3 == 1) nested = Value(Dictionary{{"key", std::move(nested)}});
+    if (i % 3 == 2) {
+      nested = Value(DiagnosticErrorPtr(
+          std::make_shared<const DiagnosticError>("Bus", i, Dictionary{{"value", std::move(nested)}})));
+    }
+  }
+  EXPECT_EQ(object.use_count(), 2);
+  std::optional<Value> copy = nested;
+  nested = Value(1);
+  EXPECT_EQ(object.use_count(), 2);
+  copy.reset();
+  EXPECT_EQ(object.use_count(), 1);
 }
 
 }  // namespace

@@ -1,5 +1,6 @@
 #include "base/json/json_document.h"
 
+#include "base/json/json_limits.h"
 #include "base/text/input_error.h"
 #include "base/text/utf8.h"
 
@@ -18,10 +19,6 @@ namespace quazor {
 namespace {
 
 using Json = nlohmann::ordered_json;
-
-constexpr std::size_t kMaxFile = 16U << 20;  // limits the input from devices, which may be endless
-// Deeper than any valid document. Limits the recursion of code that walks a document.
-constexpr std::size_t kMaxDepth = 32;
 
 std::string lineAt(std::string_view text, std::size_t offset) {
   const std::string_view before = text.substr(0, offset);
@@ -115,9 +112,9 @@ class Tracker {
   }
   void open(bool isArray) {
     element();
-    if (open_.size() == kMaxDepth) {
+    if (open_.size() == kMaxDocumentLevels) {
       throw InputError(name_ + ":" + std::to_string(line()) + ": the document is nested more than " +
-                       std::to_string(kMaxDepth) + " deep.");
+                       std::to_string(kMaxDocumentLevels) + " deep.");
     }
     open_.push_back({isArray, 0, {}, {}});
   }
@@ -169,7 +166,9 @@ std::string textOf(const std::filesystem::path& file) {
   std::array<char, 65536> piece;  // read() reports a failure where stream iterators throw
   while (stream.read(piece.data(), piece.size()) || stream.gcount() > 0) {
     text.append(piece.data(), static_cast<std::size_t>(stream.gcount()));
-    if (text.size() > kMaxFile) throw InputError(name + ": the file is larger than 16 MiB.");
+    if (text.size() > kMaxDocument) {
+      throw InputError(name + ": the file is larger than " + std::to_string(kMaxDocument >> 20U) + " MiB.");
+    }
   }
   if (stream.bad()) throw InputError(name + ": the file cannot be read.");
   return text;

@@ -17,11 +17,11 @@ namespace quazor {
 class JsonDocument {
  public:
   // Parses `text`, which must be UTF-8 and exactly one JSON value, without duplicate keys in an object and nested at
-  // most 32 deep. `name` is the user-readable name of the file. Throws InputError, "NAME:LINE: ..." or, if the path is
-  // known, "NAME:LINE: PATH: ...".
+  // most kMaxDocumentLevels deep. `name` is the user-readable name of the file. Throws InputError, "NAME:LINE: ..." or,
+  // if the path is known, "NAME:LINE: PATH: ...".
   JsonDocument(std::string text, std::string name);
 
-  // Reads a file of at most 16 MiB. Throws InputError, also if the file cannot be read.
+  // Reads a file of at most kMaxDocument bytes. Throws InputError, also if the file cannot be read.
   static JsonDocument read(const std::filesystem::path& file);
 
   const nlohmann::ordered_json& value() const { return value_; }

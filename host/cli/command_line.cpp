@@ -38,6 +38,7 @@ constexpr const char* kExitCodes = R"(Exit codes:
   0    all diagnostics passed, or all experiments returned a result
   1    a result was outside its limits, or verify, diff or selftest found a problem
   2    a diagnostic or experiment ended in an error
+  3    verify: a record is incomplete, because its run did not end
   64   the command line is invalid
   66   a plug-in, scenario, binding, profile or record cannot be read or loaded
   70   quazor itself failed
@@ -178,8 +179,8 @@ void addRunOptions(CLI::App& command, RawOptions& raw, const std::string& what) 
   addLogOptions(command, raw);
 }
 
-void addRecords(CLI::App& command, RawOptions& raw, int count, const std::string& what) {
-  command.add_option("RECORD", raw.records, what)->type_name("")->required()->expected(count);
+void addRecords(CLI::App& command, RawOptions& raw, int least, int most, const std::string& what) {
+  command.add_option("RECORD", raw.records, what)->type_name("")->required()->expected(least, most);
 }
 
 std::uint64_t parseWhole(const char* option, const std::string& text, std::uint64_t least, std::uint64_t most) {
@@ -353,7 +354,7 @@ void declareRunningCommands(CLI::App& app, RawOptions& raw) {
   addRunOptions(experiment, raw, "experiments");
   CLI::App& analyze =
       *app.add_subcommand("analyze", "Analyze the measurements in a record again and judge the new results");
-  addRecords(analyze, raw, 1, "The record");
+  addRecords(analyze, raw, 1, 1, "The record");
   addRecord(analyze, raw);
   addLogOptions(analyze, raw);
   for (CLI::App* const command : {&run, &experiment, &analyze}) {
@@ -365,10 +366,10 @@ void declareRunningCommands(CLI::App& app, RawOptions& raw) {
 }
 
 void declareOtherCommands(CLI::App& app, RawOptions& raw) {
-  CLI::App& verify = *app.add_subcommand("verify", "Check that the verdicts in a record follow from its data");
-  addRecords(verify, raw, 1, "The record");
+  CLI::App& verify = *app.add_subcommand("verify", "Check that the verdicts in records follow from their data");
+  addRecords(verify, raw, 1, CLI::detail::expected_max_vector_size, "The records");
   CLI::App& diff = *app.add_subcommand("diff", "Show the differences between two records");
-  addRecords(diff, raw, 2, "The two records");
+  addRecords(diff, raw, 2, 2, "The two records");
   CLI::App& explain = *app.add_subcommand("explain", "Explain an error, a diagnostic or a result, and what to do next");
   explain
       .add_option("WHAT", raw.names,

@@ -112,6 +112,7 @@ TEST(ParseCommandLine, ReadsTheOptionsOfRecords) {
   EXPECT_TRUE(failed->onlyFailed);
   EXPECT_EQ(failed->failedOf, "r");
   EXPECT_THAT(parse({"verify", "r"}).options->records, ElementsAre("r"));
+  EXPECT_THAT(parse({"verify", "r", "s", "[t]"}).options->records, ElementsAre("r", "s", "[t]"));
   EXPECT_THAT(parse({"diff", "r", "[s]"}).options->records, ElementsAre("r", "[s]"));
   const std::optional<Options> analyze =
       parse({"analyze", "r", "--record", "s", "--set", "x=1", "--output", "ocp:o"}).options;
@@ -241,7 +242,7 @@ TEST(ParseCommandLine, RefusesWrongUsage) {
       {{"run", "--all", "--only", "failed"}, "--only failed cannot be combined with names or --all"},
       {{"run", "A", "--of", "r"}, "--of requires --only failed"},
       {{"verify"}, "RECORD"},
-      {{"verify", "a", "b"}, "b"},
+      {{"diff", "a", "b", "c"}, "c"},
       {{"diff", "a"}, "RECORD"},
       {{"analyze"}, "RECORD"},
       {{"selftest", "--seeds", "0"}, "--seeds '0': expected an integer from 1 to 1000000"},

@@ -21,8 +21,9 @@ ExitCode runProgram(const std::vector<std::string>& arguments, const Installatio
 ExitCode runCommand(const Options& options, const Installation& installation, Console& console);
 ExitCode analyzeCommand(const Options& options, const Installation& installation, Console& console);
 
-// verify: kAllPassed if every verdict in the record follows from the rest of it, else kFailed. Throws a CommandError
-// (kCannotRead).
+// verify: kAllPassed if every verdict in each record follows from the rest of it and its run ended. Otherwise the worst
+// of kCannotRead (no complete line), kFailed (something is wrong) and kIncomplete (the run did not end). Throws a
+// CommandError (kCannotRead) if the only record cannot be read.
 ExitCode verifyCommand(const Options& options, Console& console);
 
 // diff: kAllPassed if two records agree, else kFailed. They agree if the same diagnostics have the same verdicts,

@@ -144,30 +144,41 @@ class VerifyTest(RecordTest):
                 self.assertEqual(result.returncode, 1, result.stdout)
                 self.assertTrue(result.stdout.startswith("WRONG  Fake.One: the recorded "), result.stdout)
 
-    def test_what_is_no_record_is_refused(self):
+    def assert_wrong(self, record, sentence):
+        result = quazor("verify", record)
+        self.assertEqual((result.returncode, result.stderr), (1, ""))
+        self.assertEqual(result.stdout.splitlines()[0], f"WRONG  the record '{record}', {sentence}")
+
+    def test_lines_that_are_wrong(self):
         def missing_line(events):
             del events[3]
 
         def other_form(events):
             events[0]["record"] = 2
 
+        self.assert_wrong(self.changed(missing_line),
+                          "line 4: the sequence number is 4 instead of 3; a line is missing or has been moved")
+        self.assert_wrong(self.changed(other_form), "line 1: the record has format 2, but this program reads format 1")
+        self.assert_wrong(self.write("text", "hello\n"), "line 1: not valid JSON")
+        self.assert_wrong(self.write("document", "{}\n"), "line 1: \"record\" is missing")
+        self.assert_wrong(WORKING, "line 1: not valid JSON")
+        twice = self.record.read_text().replace('"verdict":"pass"', '"verdict":"fail","verdict":"pass"')
+        line = 1 + next(i for i, line in enumerate(twice.splitlines()) if '"verdict":"fail"' in line)
+        self.assert_wrong(self.write("twice", twice), f'line {line}: the key "verdict" is duplicated')
+
+    def test_what_is_no_record_is_refused(self):
         rows = [
             (self.directory / "missing", "cannot be read: No such file or directory"),
             (self.directory, "cannot be read: it is a directory"),
             (self.write("empty", ""), "contains no events"),
-            (self.write("text", "hello\n"), "line 1: not valid JSON"),
             (self.phone, "contains no events"),
-            (self.write("document", "{}\n"), "line 1: \"record\" is missing"),
-            (WORKING, "line 1: not valid JSON"),
+            (self.write("half", self.record.read_text()[:20]), "contains no events"),
             ("/dev/null", "contains no events"),
         ]
         for path, problem in rows:
             with self.subTest(problem):
                 self.assert_refused(quazor("verify", path), 66, f"the record '{path}'", problem)
-        self.assert_refused(quazor("verify", self.changed(missing_line)), 66, "line 4: the sequence number is 4")
-        self.assert_refused(quazor("verify", self.changed(other_form)), 66, "the record has format 2, but this program reads")
         self.assert_refused(quazor("verify"), 64, "RECORD")
-        self.assert_refused(quazor("verify", self.record, self.record), 64)
         self.assert_refused(quazor("verify", ""), 64, "RECORD: the value is empty")
 
     def test_a_record_that_was_cut_off_anywhere_is_not_wrong(self):
@@ -178,14 +189,29 @@ class VerifyTest(RecordTest):
                 cut = self.directory / "cut"
                 cut.write_bytes(whole[:size])
                 result = quazor("verify", cut)
-                self.assertEqual(result.returncode, 0, result.stderr)
+                self.assertEqual(result.returncode, 3, result.stderr)
                 self.assertIn("The record is incomplete: the run did not end", result.stdout)
 
     def test_values_in_many_levels_do_not_crash_it(self):
         deep = '{"array":[' * 100_000 + "]}" * 100_000
         line = '{"sequence":1,"event":"collected","key":"k","value":' + deep + "}\n"
         record = self.write("deep", self.record.read_text().splitlines(keepends=True)[0] + line)
-        self.assert_refused(quazor("verify", record), 66, "line 2: value nested too deeply")
+        self.assert_wrong(record, "line 2: the line is nested more than 2016 levels deep")
+        for members in ('"faults":[{"fault":%s,"fired":1}],"event":"faultsCounted"', '"event":%s'):
+            line = '{"sequence":1,' + members % ("[" * 100_000 + "]" * 100_000) + "}\n"
+            record = self.write("deep", self.record.read_text().splitlines(keepends=True)[0] + line)
+            self.assert_wrong(record, "line 2: the line is nested more than 2016 levels deep")
+            for command in (["analyze", record], ["diff", record, self.record],
+                            ["run", "--only", "failed", "--of", record]):
+                self.assert_refused(quazor(*command), 66, "line 2: the line is nested more than 2016 levels deep")
+
+    def test_a_record_cut_before_the_failing_diagnostic_is_incomplete(self):
+        self.recorded("--set", "measured=1", "--set", "minimum=90", code=1)
+        lines = self.record.read_text().splitlines(keepends=True)
+        begins = next(i for i, line in enumerate(lines) if '"diagnosticBegan"' in line)
+        for count in (begins, len(lines) - 1):
+            result = quazor("verify", self.write("cut.jsonl", "".join(lines[:count])))
+            self.assertEqual(result.returncode, 3, result.stdout)
 
     def test_a_standard_output_that_is_full(self):
         with open("/dev/full", "w") as full:

@@ -11,11 +11,18 @@
 
 namespace quazor {
 
-ExitCode verifyCommand(const Options& options, Console& console) {
-  const std::filesystem::path& file = options.records.front();
-  const StoredRecord stored = readRecord(file);
+namespace {
+
+// Appends what verify says about a record and returns its exit code.
+ExitCode verifyRecord(const std::filesystem::path& file, std::ostream& answer) {
+  StoredRecord stored;
+  try {
+    stored = readRecord(file);
+  } catch (const RecordDefect& defect) {
+    answer << "WRONG  " << printable(defect.what()) << '\n';
+    return ExitCode::kFailed;
+  }
   const std::vector<std::string> problems = problemsOf(stored.events);
-  std::ostringstream answer;
   for (const std::string& problem : problems) answer << "WRONG  " << printable(problem) << '\n';
   const auto verdicts =
       static_cast<std::size_t>(std::count_if(stored.events.begin(), stored.events.end(), [](const RunEvent& event) {
@@ -28,8 +35,32 @@ ExitCode verifyCommand(const Options& options, Console& console) {
     answer << "The record is incomplete: the run did not end"
            << (stored.cutOff ? ", and the record's last line is cut off.\n" : ".\n");
   }
+  if (!problems.empty()) return ExitCode::kFailed;
+  return complete ? ExitCode::kAllPassed : ExitCode::kIncomplete;
+}
+
+}  // namespace
+
+ExitCode verifyCommand(const Options& options, Console& console) {
+  constexpr ExitCode kWorstFirst[] = {ExitCode::kCannotRead, ExitCode::kFailed, ExitCode::kIncomplete};
+  const bool isOne = options.records.size() == 1;
+  std::ostringstream answer;
+  std::vector<ExitCode> codes;
+  for (const std::filesystem::path& file : options.records) {
+    if (!isOne) answer << printable(file.string()) << ":\n";
+    try {
+      codes.push_back(verifyRecord(file, answer));
+    } catch (const CommandError& refusal) {
+      if (isOne) throw;
+      answer << "WRONG  " << printable(refusal.what()) << '\n';
+      codes.push_back(refusal.code());
+    }
+  }
   writeOutput(options.report, console, answer.str());
-  return problems.empty() ? ExitCode::kAllPassed : ExitCode::kFailed;
+  for (const ExitCode code : kWorstFirst) {
+    if (std::find(codes.begin(), codes.end(), code) != codes.end()) return code;
+  }
+  return ExitCode::kAllPassed;
 }
 
 ExitCode diffCommand(const Options& options, Console& console) {

@@ -21,10 +21,12 @@ class RecordCommandsTest : public testing::Test {
     return writer.file();
   }
 
-  ExitCode verify(const std::filesystem::path& file) {
+  ExitCode verify(const std::filesystem::path& file) { return verifyAll({file}); }
+
+  ExitCode verifyAll(const std::vector<std::filesystem::path>& files) {
     out_.str("");
     Options options;
-    options.records = {file};
+    options.records = files;
     return verifyCommand(options, console_);
   }
 
@@ -61,15 +63,42 @@ TEST_F(RecordCommandsTest, VerifyTellsWhatIsWrong) {
 TEST_F(RecordCommandsTest, VerifyTellsThatARunDidNotComeToItsEnd) {
   std::vector<RunEvent> events = wholeRun();
   events.pop_back();
-  EXPECT_EQ(verify(record("a", events)), ExitCode::kAllPassed);
+  EXPECT_EQ(verify(record("a", events)), ExitCode::kIncomplete);
   EXPECT_THAT(out_.str(), testing::EndsWith("0 problems\nThe record is incomplete: the run did not end.\n"));
   const std::string text = directory_.read("a");
-  EXPECT_EQ(verify(directory_.write("b", text.substr(0, text.size() - 3))), ExitCode::kAllPassed);
+  EXPECT_EQ(verify(directory_.write("b", text.substr(0, text.size() - 3))), ExitCode::kIncomplete);
   EXPECT_THAT(
       out_.str(),
       testing::EndsWith("The record is incomplete: the run did not end, and the record's last line is cut off.\n"));
-  EXPECT_EQ(verify(record("c", {runOf({})})), ExitCode::kAllPassed);
+  EXPECT_EQ(verify(record("c", {runOf({})})), ExitCode::kIncomplete);
   EXPECT_THAT(out_.str(), testing::StartsWith("1 event, 0 verdicts, 0 problems\n"));
+}
+
+TEST_F(RecordCommandsTest, VerifyAcceptsARunThatWasInterruptedAndEnded) {
+  EXPECT_EQ(verify(record("a", {runOf({"A"}), RunEnded{"", momentAt(1)}})), ExitCode::kAllPassed);
+}
+
+TEST_F(RecordCommandsTest, VerifyTellsOfALineThatIsWrong) {
+  const std::filesystem::path file = directory_.write("a", "{}\n");
+  EXPECT_EQ(verify(file), ExitCode::kFailed);
+  EXPECT_EQ(out_.str(), "WRONG  the record '" + file.string() + "', line 1: \"record\" is missing\n");
+}
+
+TEST_F(RecordCommandsTest, TheWorstOfSeveralRecordsCounts) {
+  const std::filesystem::path whole = record("whole", wholeRun());
+  const std::filesystem::path cut = record("cut", {runOf({"A"})});
+  const std::filesystem::path wrong = directory_.write("wrong", "{}\n");
+  const std::filesystem::path empty = directory_.write("empty", "");
+  const struct {
+    std::vector<std::filesystem::path> files;
+    ExitCode code;
+  } kRows[] = {{{whole, whole}, ExitCode::kAllPassed},         {{whole, cut}, ExitCode::kIncomplete},
+               {{wrong, cut, whole}, ExitCode::kFailed},       {{cut, wrong}, ExitCode::kFailed},
+               {{whole, empty, wrong}, ExitCode::kCannotRead}, {{cut, empty}, ExitCode::kCannotRead}};
+  for (const auto& row : kRows) {
+    EXPECT_EQ(verifyAll(row.files), row.code) << out_.str();
+    for (const auto& file : row.files) EXPECT_THAT(out_.str(), testing::HasSubstr(file.string() + ":\n"));
+  }
 }
 
 TEST_F(RecordCommandsTest, DiffTellsWhatIsDifferent) {

@@ -2,13 +2,13 @@
 
 #include "contract/contract.h"
 #include "host/command/failed_only.h"
+#include "host/command/output_check.h"
 #include "host/command/selection.h"
 #include "host/device/phone.h"
 #include "host/error/host_error.h"
 #include "host/run/event_pipeline.h"
 #include "host/run/isolation.h"
 #include "host/system/interrupt_watcher.h"
-#include "host/system/output_file.h"
 #include "host/text/table.h"
 #include "host/text/timestamp.h"
 
@@ -96,35 +96,13 @@ RunStarted beginningOf(const Options& options, const Installation& installation,
   return began;
 }
 
-// Checks the output files before anything runs: a run whose output cannot be written is worthless.
-void checkOutputs(const Options& options) {
-  std::vector<std::filesystem::path> regular;
-  const auto check = [&regular](const std::filesystem::path& file) {
-    std::error_code error;
-    if (file.empty() || (std::filesystem::exists(file, error) && !std::filesystem::is_regular_file(file, error)))
-      return;
-    const std::filesystem::path target = std::filesystem::weakly_canonical(std::filesystem::absolute(file), error);
-    if (std::find(regular.begin(), regular.end(), target) != regular.end()) {
-      throw CommandError(ExitCode::kUsage, "the file '" + file.string() + "' would be written twice");
-    }
-    regular.push_back(target);
-  };
-  const auto checkReport = [&check](const std::filesystem::path& file) {
-    validateOutputFile(file);
-    check(file);
-  };
-  check(options.record);
-  if (!options.report.output.empty()) checkReport(options.report.output);
-  for (const OutputRequest& output : options.report.outputs) checkReport(output.file);
-}
-
 EventPipelineOptions eventOptions(const Options& options, bool keepsLastRun) {
   return {options.record, keepsLastRun, options.systemLog, options.report};
 }
 
 ExitCode perform(const Options& options, const Installation& installation, Console& console, RunStarted began,
                  const std::vector<Job>& jobs, const std::vector<FailedPlugin>& failed, const RunOptions& runOptions) {
-  checkOutputs(options);
+  checkOutputs(options, installation, began);
   EventPipeline events(eventOptions(options, options.command == Command::kRun), console);
   std::optional<InterruptWatcher> watcher;
   if (options.inProcess) {
@@ -146,12 +124,12 @@ ExitCode perform(const Options& options, const Installation& installation, Conso
 
 // Handles the case that nothing failed: still writes the requested files.
 ExitCode performNothing(const Options& options, const Installation& installation, Console& console) {
-  checkOutputs(options);
+  RunStarted began = beginningOf(options, installation, {}, {});
+  began.phone = options.phone.string();
+  checkOutputs(options, installation, began);
   const bool isForPeople = options.report.format == Format::kText || !options.report.output.empty();
   (isForPeople ? console.out : console.err) << "Everything passed in the last run.\n" << std::flush;
   EventPipeline events(eventOptions(options, false), console);
-  RunStarted began = beginningOf(options, installation, {}, {});
-  began.phone = options.phone.string();
   events.onEvent(std::move(began));
   events.onEvent(RunEnded{std::nullopt, dateNow()});
   events.requireRecords();

@@ -13,6 +13,7 @@ enum class ExitCode : int {
   kAllPassed = 0,
   kFailed = 1,         // a diagnostic failed its limits: the hardware is faulty
   kError = 2,          // a diagnostic ended in an error: the state of the hardware is unknown
+  kIncomplete = 3,     // a record is correct as far as it goes, but its run did not end
   kUsage = 64,         // the command line is invalid
   kCannotRead = 66,    // a plug-in, scenario or profile cannot be read, loaded or used
   kInternal = 70,      // a defect of quazor

@@ -28,6 +28,7 @@ enum class HostErrorCode : std::int64_t {
   kNotRecorded = 10,     // the record of the run could not be written
   kInterrupted = 11,     // the user interrupted the run
   kNoProcess = 12,       // the process for the diagnostic could not be created
+  kTooDeep = 13,         // the plug-in gave a value that is nested too deeply to be recorded
 };
 
 DiagnosticErrorPtr hostError(HostErrorCode code, std::string message);

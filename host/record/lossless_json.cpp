@@ -1,5 +1,6 @@
 #include "host/record/lossless_json.h"
 
+#include "base/json/json_limits.h"
 #include "base/text/hexadecimal.h"
 #include "base/text/input_error.h"
 #include "base/text/utf8.h"
@@ -17,9 +18,6 @@ namespace quazor {
 using Json = nlohmann::ordered_json;
 
 namespace {
-
-// The nesting limit: more than any diagnostic needs, and small enough for the stack.
-constexpr int kMaxLevels = 500;
 
 class DescribedObject final : public Object {
  public:
@@ -61,7 +59,53 @@ const Json& arrayIn(const Json& json) {
   return json;
 }
 
-// `levels` is the number of levels that may still follow.
+[[noreturn]] void refuseNesting() {
+  throw InputError("the value is nested more than " + std::to_string(kMaxValueLevels) + " levels deep");
+}
+
+// In all functions below, `levels` is the number of levels that may still follow.
+
+Json nestedJson(const Value& value, int levels);
+
+Json nestedDictionaryJson(const Dictionary& dictionary, int levels) {
+  Json entries = Json::array();
+  for (const auto& [key, value] : dictionary) {
+    entries.push_back(Json::array({losslessText(key), nestedJson(value, levels)}));
+  }
+  return entries;
+}
+
+Json nestedErrorJson(const DiagnosticErrorPtr& error, int levels) {
+  if (error == nullptr) return {};
+  return {{"domain", losslessText(error->domain())},
+          {"code", error->code()},
+          {"userInfo", nestedDictionaryJson(error->userInfo(), levels)}};
+}
+
+Json nestedJson(const Value& value, int levels) {
+  if (levels == 0) refuseNesting();
+  switch (value.kind()) {
+    case Value::Kind::kBoolean: return tagged("boolean", *value.boolean());
+    case Value::Kind::kSigned: return tagged("signed", *value.signedInteger());
+    case Value::Kind::kUnsigned: return tagged("unsigned", *value.unsignedInteger());
+    case Value::Kind::kDouble: return tagged("double", losslessNumber(*value.doubleNumber()));
+    case Value::Kind::kFloat: return tagged("float", losslessNumber(static_cast<double>(*value.floatNumber())));
+    case Value::Kind::kString: return tagged("string", losslessText(*value.string()));
+    case Value::Kind::kDictionary: return tagged("dictionary", nestedDictionaryJson(*value.dictionary(), levels - 1));
+    case Value::Kind::kDate: return tagged("date", value.date()->time_since_epoch().count());
+    case Value::Kind::kBytes: return tagged("bytes", hexadecimal(*value.bytes()));
+    case Value::Kind::kError: return tagged("error", nestedErrorJson(value.error(), levels - 1));
+    case Value::Kind::kObject: {
+      const std::shared_ptr<Object> object = value.object();
+      return tagged("object", object == nullptr ? Json() : losslessText(object->description()));
+    }
+    case Value::Kind::kArray: break;
+  }
+  Json elements = Json::array();
+  for (const Value& element : *value.array()) elements.push_back(nestedJson(element, levels - 1));
+  return tagged("array", std::move(elements));
+}
+
 Value nestedValueFrom(const Json& json, int levels);
 
 Value arrayFrom(const Json& json, int levels) {
@@ -86,7 +130,7 @@ DiagnosticErrorPtr nestedErrorFrom(const Json& json, int levels) {
 }
 
 Value nestedValueFrom(const Json& json, int levels) {
-  if (levels == 0) throw InputError("value nested too deeply");
+  if (levels == 0) refuseNesting();
   if (!json.is_object() || json.size() != 1) throw InputError("expected a value: an object with one key");
   const std::string& kind = json.begin().key();
   const Json& content = json.begin().value();
@@ -148,47 +192,17 @@ double numberFrom(const Json& json) {
   return json.get<double>();
 }
 
-Json losslessValue(const Value& value) {
-  switch (value.kind()) {
-    case Value::Kind::kBoolean: return tagged("boolean", *value.boolean());
-    case Value::Kind::kSigned: return tagged("signed", *value.signedInteger());
-    case Value::Kind::kUnsigned: return tagged("unsigned", *value.unsignedInteger());
-    case Value::Kind::kDouble: return tagged("double", losslessNumber(*value.doubleNumber()));
-    case Value::Kind::kFloat: return tagged("float", losslessNumber(static_cast<double>(*value.floatNumber())));
-    case Value::Kind::kString: return tagged("string", losslessText(*value.string()));
-    case Value::Kind::kDictionary: return tagged("dictionary", losslessDictionary(*value.dictionary()));
-    case Value::Kind::kDate: return tagged("date", value.date()->time_since_epoch().count());
-    case Value::Kind::kBytes: return tagged("bytes", hexadecimal(*value.bytes()));
-    case Value::Kind::kError: return tagged("error", losslessError(value.error()));
-    case Value::Kind::kObject: {
-      const std::shared_ptr<Object> object = value.object();
-      return tagged("object", object == nullptr ? Json() : losslessText(object->description()));
-    }
-    case Value::Kind::kArray: break;
-  }
-  Json elements = Json::array();
-  for (const Value& element : *value.array()) elements.push_back(losslessValue(element));
-  return tagged("array", std::move(elements));
-}
+Json losslessValue(const Value& value) { return nestedJson(value, kMaxValueLevels); }
 
-Value valueFrom(const Json& json) { return nestedValueFrom(json, kMaxLevels); }
+Value valueFrom(const Json& json) { return nestedValueFrom(json, kMaxValueLevels); }
 
-Json losslessDictionary(const Dictionary& dictionary) {
-  Json entries = Json::array();
-  for (const auto& [key, value] : dictionary) entries.push_back(Json::array({losslessText(key), losslessValue(value)}));
-  return entries;
-}
+Json losslessDictionary(const Dictionary& dictionary) { return nestedDictionaryJson(dictionary, kMaxValueLevels); }
 
-Dictionary dictionaryFrom(const Json& json) { return nestedDictionaryFrom(json, kMaxLevels); }
+Dictionary dictionaryFrom(const Json& json) { return nestedDictionaryFrom(json, kMaxValueLevels); }
 
-Json losslessError(const DiagnosticErrorPtr& error) {
-  if (error == nullptr) return {};
-  return {{"domain", losslessText(error->domain())},
-          {"code", error->code()},
-          {"userInfo", losslessDictionary(error->userInfo())}};
-}
+Json losslessError(const DiagnosticErrorPtr& error) { return nestedErrorJson(error, kMaxValueLevels); }
 
-DiagnosticErrorPtr errorFrom(const Json& json) { return nestedErrorFrom(json, kMaxLevels); }
+DiagnosticErrorPtr errorFrom(const Json& json) { return nestedErrorFrom(json, kMaxValueLevels); }
 
 Json losslessMeasurement(const Measurement& measurement) {
   return Json::array({losslessNumber(measurement.value()), losslessText(measurement.unit().symbol())});

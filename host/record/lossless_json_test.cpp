@@ -1,5 +1,7 @@
 #include "host/record/lossless_json.h"
 
+#include "base/json/json_limits.h"
+#include "base/json/json_line.h"
 #include "base/text/input_error.h"
 #include "host/testing/test_values.h"
 #include "tests/support/thrown_text.h"
@@ -225,7 +227,32 @@ TEST(ValueFrom, RefusesWhatIsTooDeepInsteadOfRunningOutOfStack) {
   std::string text;
   for (std::size_t i = 0; i < kLevels; ++i) text += R"({"array":[)";
   for (std::size_t i = 0; i < kLevels; ++i) text += "]}";
-  EXPECT_THAT(thrownText<InputError>([&] { valueFrom(Json::parse(text)); }), HasSubstr("nested too deeply"));
+  EXPECT_THAT(thrownText<InputError>([&] { valueFrom(Json::parse(text)); }),
+              HasSubstr("nested more than 500 levels deep"));
+}
+
+TEST(LosslessValue, RefusesWhatIsTooDeepToBeReadBack) {
+  Value value(1);
+  for (int i = 1; i < kMaxValueLevels; ++i) value = Value(Dictionary{{"a", std::move(value)}});
+  const Value atLimit = value;
+  EXPECT_EQ(valueFrom(parseJsonLine(losslessValue(atLimit).dump())), atLimit);
+  const std::string sentence = "the value is nested more than 500 levels deep";
+  for (int i = 0; i < 100'000; ++i) {
+    value = Value(DiagnosticErrorPtr(std::make_shared<const DiagnosticError>("D", 1, Dictionary{{"a", value}})));
+    if (i > 0 && i < 99'999) continue;
+    EXPECT_EQ(thrownText<InputError>([&] { losslessValue(value); }), sentence);
+    EXPECT_EQ(thrownText<InputError>([&] { losslessDictionary({{"a", value}}); }), sentence);
+    EXPECT_EQ(thrownText<InputError>([&] { losslessError(errorWithMessage("D", 1, "m", value.error())); }), sentence);
+  }
+}
+
+TEST(LosslessValue, OfAllKindsAtTheLimitFitIntoALine) {
+  Value value(1);
+  for (int i = 1; i < kMaxValueLevels; ++i) {
+    value = Value(DiagnosticErrorPtr(std::make_shared<const DiagnosticError>("D", 1, Dictionary{{"a", value}})));
+  }
+  const std::string line = Json{{"value", losslessValue(value)}}.dump();
+  EXPECT_EQ(valueFrom(parseJsonLine(line)["value"]).error()->domain(), "D");
 }
 
 TEST(MemberOf, TellsWhatIsMissing) {

@@ -1,5 +1,7 @@
 #include "host/record/record_file.h"
 
+#include "base/json/json_limits.h"
+#include "base/json/json_line.h"
 #include "base/text/input_error.h"
 #include "host/error/exit_code.h"
 #include "host/model/record_builder.h"
@@ -7,8 +9,11 @@
 #include "host/record/run_event_json.h"
 
 #include <fcntl.h>
+#include <sys/file.h>
+#include <sys/stat.h>
 #include <unistd.h>
 
+#include <array>
 #include <cerrno>
 #include <cstdio>
 #include <cstring>
@@ -25,13 +30,64 @@ using Json = nlohmann::ordered_json;
 constexpr mode_t kMode = 0666;  // reduced by the umask
 
 [[noreturn]] void refuseLine(const std::filesystem::path& file, std::uint64_t line, const std::string& why) {
-  throw CommandError(ExitCode::kCannotRead,
+  throw RecordDefect(ExitCode::kCannotRead,
                      "the record '" + file.string() + "', line " + std::to_string(line) + ": " + why);
+}
+
+// A descriptor that is closed at the end.
+class Descriptor {
+ public:
+  explicit Descriptor(int number) : number_(number) {}
+  Descriptor(const Descriptor&) = delete;
+  Descriptor& operator=(const Descriptor&) = delete;
+  ~Descriptor() {
+    if (number_ >= 0) ::close(number_);
+  }
+
+  int number() const { return number_; }
+
+ private:
+  const int number_;
+};
+
+bool isSameFile(int descriptor, const std::filesystem::path& file) {
+  struct stat open {};
+  struct stat named {};
+  return ::fstat(descriptor, &open) == 0 && ::stat(file.c_str(), &named) == 0 && open.st_dev == named.st_dev &&
+         open.st_ino == named.st_ino;
+}
+
+// Returns false with errno on failure: EEXIST if the target exists and may not be replaced.
+bool rename(const std::filesystem::path& from, const std::filesystem::path& to, bool mayReplace) {
+  if (!mayReplace) {
+    if (::renameat2(AT_FDCWD, from.c_str(), AT_FDCWD, to.c_str(), RENAME_NOREPLACE) == 0) return true;
+    if (errno != EINVAL && errno != ENOSYS) return false;  // these two: the file system cannot do it
+  }
+  return std::rename(from.c_str(), to.c_str()) == 0;
+}
+
+// Reads a line without its line end, like std::getline, but stops after a line that is too long to be accepted.
+bool readLine(std::istream& stream, std::string& line) {
+  std::array<char, 65536> piece{};
+  line.clear();
+  while (line.size() <= kMaxLine) {
+    stream.getline(piece.data(), piece.size());
+    const auto taken = static_cast<std::size_t>(stream.gcount());
+    if (stream.good()) {
+      line.append(piece.data(), taken - 1);  // without the line end
+      return true;
+    }
+    line.append(piece.data(), taken);
+    if (stream.eof()) return !line.empty() && !stream.bad();
+    if (stream.bad()) return false;
+    stream.clear();  // the piece is full
+  }
+  return true;
 }
 
 RunEvent eventInLine(const std::filesystem::path& file, std::uint64_t sequence, const std::string& line) {
   try {
-    const Json json = Json::parse(line);
+    const Json json = parseJsonLine(line);
     if (sequence == 0) {
       const Json& format = memberOf(json, "record");
       if (format != kRecordFormat) {
@@ -44,8 +100,6 @@ RunEvent eventInLine(const std::filesystem::path& file, std::uint64_t sequence, 
                        std::to_string(sequence) + "; a line is missing or has been moved");
     }
     return eventFrom(json);
-  } catch (const Json::exception&) {
-    refuseLine(file, sequence + 1, "not valid JSON");
   } catch (const InputError& problem) {
     refuseLine(file, sequence + 1, problem.what());
   }
@@ -60,30 +114,42 @@ std::string recordLine(const RunEvent& event, std::uint64_t sequence) {
   return line.dump(-1, ' ', false, Json::error_handler_t::replace) + "\n";
 }
 
-RecordWriter::RecordWriter(std::filesystem::path file) : file_(std::move(file)) {
-  const auto refuse = [this](const std::string& why) {
-    throw CommandError(ExitCode::kCannotWrite, "the record '" + file_.string() + "' cannot be written: " + why);
-  };
-  std::error_code ignored;
-  if (std::filesystem::is_directory(file_, ignored)) refuse("it is a directory");
-  if (std::filesystem::exists(file_, ignored) && !std::filesystem::is_regular_file(file_, ignored)) {
+RecordWriter::RecordWriter(std::filesystem::path file, Unfinished unfinished) : file_(std::move(file)) {
+  std::error_code error;
+  if (std::filesystem::is_directory(file_, error)) refuse("it is a directory");
+  if (std::filesystem::exists(file_, error) && !std::filesystem::is_regular_file(file_, error)) {
     descriptor_ = ::open(file_.c_str(), O_WRONLY | O_CLOEXEC);
-  } else {
-    // Resolves a symbolic link, because the rename below would replace the link itself.
-    std::error_code error;
-    const std::filesystem::path canonical = std::filesystem::weakly_canonical(file_, error);
-    const std::filesystem::path target = error ? file_ : canonical;
-    std::filesystem::path temporary = target;
-    temporary += "." + std::to_string(::getpid()) + ".tmp";
-    descriptor_ = ::open(temporary.c_str(), O_WRONLY | O_CREAT | O_EXCL | O_CLOEXEC, kMode);
-    if (descriptor_ >= 0 && std::rename(temporary.c_str(), target.c_str()) != 0) {
-      const std::string why = std::strerror(errno);
-      ::unlink(temporary.c_str());
-      ::close(descriptor_);
-      refuse(why);
-    }
+    if (descriptor_ < 0) refuse(std::strerror(errno));
+    return;
   }
-  if (descriptor_ < 0) refuse(std::strerror(errno));
+  // Resolves a symbolic link, because a rename would replace the link itself.
+  const std::filesystem::path canonical = std::filesystem::weakly_canonical(file_, error);
+  create(error ? file_ : canonical, unfinished);
+}
+
+void RecordWriter::refuse(const std::string& why) const {
+  throw CommandError(ExitCode::kCannotWrite, "the record '" + file_.string() + "' cannot be written: " + why);
+}
+
+void RecordWriter::create(const std::filesystem::path& target, Unfinished unfinished) {
+  const bool replaces = unfinished == Unfinished::kReplace;
+  std::filesystem::path temporary = target;
+  temporary += "." + std::to_string(::getpid()) + ".tmp";
+  const Descriptor created(::open(temporary.c_str(), O_WRONLY | O_CREAT | O_EXCL | O_CLOEXEC, kMode));
+  if (created.number() < 0) refuse(std::strerror(errno));
+  ::flock(created.number(), LOCK_EX | LOCK_NB);
+  for (;;) {
+    const Descriptor old(replaces ? -1 : ::open(target.c_str(), O_RDONLY | O_NOFOLLOW | O_CLOEXEC));
+    const bool isBusy = old.number() >= 0 && ::flock(old.number(), LOCK_EX | LOCK_NB) != 0 && errno == EWOULDBLOCK;
+    if (!isBusy && old.number() >= 0 && !isSameFile(old.number(), target)) continue;  // replaced in the meantime
+    const bool mayReplace = replaces || old.number() >= 0 || ::access(target.c_str(), F_OK) == 0;
+    if (!isBusy && rename(temporary, target, mayReplace)) break;
+    if (!isBusy && errno == EEXIST) continue;  // created in the meantime
+    const std::string why = isBusy ? "another process is writing it" : std::strerror(errno);
+    ::unlink(temporary.c_str());
+    refuse(why);
+  }
+  descriptor_ = ::fcntl(created.number(), F_DUPFD_CLOEXEC, 0);  // keeps the lock
 }
 
 RecordWriter::~RecordWriter() { ::close(descriptor_); }
@@ -91,6 +157,10 @@ RecordWriter::~RecordWriter() { ::close(descriptor_); }
 void RecordWriter::onEvent(const RunEvent& event, const std::string& line) {
   ++taken_;
   if (!problem_.empty()) return;
+  if (line.size() - 1 > kMaxLine) {
+    problem_ = "an event takes more than " + std::to_string(kMaxLine >> 20U) + " MiB";
+    return;
+  }
   write(line);
   // The outcome of a run must survive a crash of the machine.
   if (std::holds_alternative<RunEnded>(event) && problem_.empty()) ::fdatasync(descriptor_);
@@ -117,7 +187,7 @@ StoredRecord readRecord(const std::filesystem::path& file) {
   }
   StoredRecord stored;
   std::string line;
-  while (std::getline(stream, line)) {
+  while (readLine(stream, line)) {
     if (stream.eof()) {
       stored.cutOff = true;
       break;

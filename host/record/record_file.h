@@ -1,6 +1,7 @@
 // Records: files with all events of a run, one per line. docs/record_format.md is the public description.
 #pragma once
 
+#include "host/error/exit_code.h"
 #include "host/model/run_event.h"
 
 #include <cstdint>
@@ -21,9 +22,12 @@ std::string recordLine(const RunEvent& event, std::uint64_t sequence);
 // Thread: one at a time.
 class RecordWriter final : public RunEventSink {
  public:
-  // Creates the file, replacing an existing one atomically. Throws a CommandError (kCannotWrite) if it cannot be
-  // created.
-  explicit RecordWriter(std::filesystem::path file);
+  // What happens to an existing record that another writer has not finished.
+  enum class Unfinished { kRefuse, kReplace };
+
+  // Creates the file, replacing an existing one atomically. It is locked until the writer ends. Throws a CommandError
+  // (kCannotWrite) if it cannot be created.
+  explicit RecordWriter(std::filesystem::path file, Unfinished unfinished = Unfinished::kRefuse);
   ~RecordWriter() override;
 
   // After a failure nothing more is written.
@@ -36,6 +40,9 @@ class RecordWriter final : public RunEventSink {
   const std::string& problem() const { return problem_; }
 
  private:
+  [[noreturn]] void refuse(const std::string& why) const;
+  // Creates the regular file at `target`.
+  void create(const std::filesystem::path& target, Unfinished unfinished);
   void write(const std::string& line);
 
   const std::filesystem::path file_;
@@ -50,7 +57,14 @@ struct StoredRecord {
   bool cutOff = false;  // the last line is incomplete and not included in the events
 };
 
-// Throws a CommandError (kCannotRead) that names file and line if the file cannot be read or is not a record.
+// A line of a record that is wrong. Thread: any.
+class RecordDefect : public CommandError {
+ public:
+  using CommandError::CommandError;
+};
+
+// Throws a CommandError (kCannotRead) that names the file if it cannot be read or has no complete line, and a
+// RecordDefect (kCannotRead) that names file and line if a line is wrong.
 StoredRecord readRecord(const std::filesystem::path& file);
 
 // The run stored in a record. Incomplete diagnostics have the verdict kError.

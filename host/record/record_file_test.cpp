@@ -1,5 +1,6 @@
 #include "host/record/record_file.h"
 
+#include "base/json/json_limits.h"
 #include "host/error/exit_code.h"
 #include "host/record/run_event_json.h"
 #include "host/testing/test_directory.h"
@@ -139,6 +140,79 @@ TEST_F(RecordFileTest, RefusesARecordThatWasChanged) {
   EXPECT_THAT(refusalOfText(replaced(0, R"("record":1)", R"("record":2)")),
               HasSubstr("line 1: the record has format 2, but this program reads format 1"));
   EXPECT_THAT(refusalOfText(replaced(0, R"("record":1)", R"("recorder":1)")), HasSubstr("\"record\" is missing"));
+}
+
+TEST_F(RecordFileTest, RefusesAKeyThatALineHasTwice) {
+  write(wholeRun());
+  std::string text = directory_.read("record");
+  const std::string verdict = R"("verdict":"pass")";
+  text.replace(text.find(verdict), verdict.size(), R"("verdict":"fail",)" + verdict);
+  EXPECT_THAT(refusalOfText(text), HasSubstr(R"(: the key "verdict" is duplicated)"));
+}
+
+TEST_F(RecordFileTest, RefusesWhatIsTooDeepOrTooLongAnywhereInALine) {
+  write({runOf({})});
+  const std::string first = directory_.read("record");
+  const std::string deep = std::string(100'000, '[') + std::string(100'000, ']');
+  const std::string lines[] = {
+      R"({"sequence":1,"event":"faultsCounted","faults":[{"fault":)" + deep + R"(,"fired":1}]})",
+      R"({"sequence":1,"event":"collected","key":"k","value":)" + deep + "}",
+      R"({"sequence":)" + deep + R"(,"event":"diagnosticCompleted"})",
+      R"({"sequence":1,"event":)" + deep + "}",
+      R"({"unknown":)" + deep + R"(,"sequence":1,"event":"diagnosticCompleted"})",
+      std::string(100'000, '['),
+  };
+  for (const std::string& line : lines) {
+    EXPECT_THAT(refusalOfText(first + line + "\n"), HasSubstr("line 2: the line is nested more than 2016 levels deep"))
+        << line.substr(0, 60);
+  }
+  EXPECT_THAT(refusalOfText(R"({"record":)" + deep + "}\n"), HasSubstr("line 1: the line is nested more than"));
+  EXPECT_THAT(refusalOfText(first + std::string(kMaxLine + 1, ' ') + "\n"),
+              HasSubstr("line 2: the line is longer than 64 MiB"));
+  EXPECT_THAT(refusalOf(ExitCode::kCannotRead, [] { readRecord("/dev/zero"); }),
+              HasSubstr("line 1: the line is longer than 64 MiB"));
+}
+
+TEST_F(RecordFileTest, ReadsLinesOfAnyLengthUpToTheLimit) {
+  std::vector<RunEvent> events = {runOf({})};
+  for (const std::size_t length : {65'400U, 65'500U, 65'535U, 65'536U, 65'537U, 131'072U, 1'000'000U}) {
+    events.emplace_back(AuxiliaryDataAdded{"key", Value(std::string(length, 'x'))});
+  }
+  write(events);
+  const StoredRecord stored = readRecord(file_);
+  ASSERT_EQ(stored.events.size(), events.size());
+  for (std::size_t i = 0; i < events.size(); ++i) EXPECT_TRUE(eventJson(stored.events[i]) == eventJson(events[i])) << i;
+}
+
+TEST_F(RecordFileTest, WritesNoEventThatCouldNotBeReadBack) {
+  RecordWriter writer(file_);
+  writer.onEvent(runOf({}));
+  writer.onEvent(AuxiliaryDataAdded{"key", Value(std::string(kMaxLine, 'x'))});
+  EXPECT_EQ(writer.problem(), "an event takes more than 64 MiB");
+  EXPECT_EQ(readRecord(file_).events.size(), 1U);
+}
+
+TEST_F(RecordFileTest, RefusesARecordThatAnotherWriterHasNotFinished) {
+  const auto refusalOfWriter = [](const fs::path& file) {
+    return refusalOf(ExitCode::kCannotWrite, [&] { const RecordWriter second(file); });
+  };
+  fs::create_symlink("record", directory_.path() / "link");
+  for (int i = 0; i < 2; ++i) {  // a new file, then one that is replaced
+    RecordWriter first(file_);
+    first.onEvent(runOf({}));
+    const std::string before = directory_.read("record");
+    EXPECT_EQ(refusalOfWriter(file_),
+              "the record '" + file_.string() + "' cannot be written: another process is writing it");
+    EXPECT_THAT(refusalOfWriter(directory_.path() / "link"), HasSubstr("another process is writing it"));
+    first.onEvent(RunEnded{std::nullopt, momentAt(1)});
+    EXPECT_EQ(readRecord(file_).events.size(), 2U);
+    EXPECT_THAT(directory_.read("record"), StartsWith(before));
+    EXPECT_EQ(std::distance(fs::directory_iterator(directory_.path()), fs::directory_iterator()), 2);
+  }
+  RecordWriter first(file_);
+  RecordWriter second(file_, RecordWriter::Unfinished::kReplace);
+  first.onEvent(runOf({}));
+  EXPECT_EQ(directory_.read("record"), "");
 }
 
 TEST_F(RecordFileTest, RefusesWhatIsNoRecord) {

@@ -1,6 +1,7 @@
 #include "host/run/diagnostic_run.h"
 
 #include "host/error/host_error.h"
+#include "host/error/nesting.h"
 #include "host/model/run_log.h"
 #include "host/plugin/null_platform.h"
 #include "host/run/run_concurrency.h"
@@ -84,10 +85,11 @@ class Run {
     if (!ready) return nullptr;
     std::unique_ptr<QZExperimentResult> result;
     inStage(Stage::kRun, [&] {
-      attempt("run of " + name, [&](DiagnosticErrorPtr* error) {
+      const bool succeeded = attempt("run of " + name, [&](DiagnosticErrorPtr* error) {
         result = experiment->run(error);
-        return result != nullptr;
+        return result != nullptr && isRecordable(*result, error);
       });
+      if (!succeeded) result = nullptr;
     });
     if (result != nullptr) tell(*result);
     if (auto* const teardown = dynamic_cast<QZTeardown*>(experiment.get())) {
@@ -122,6 +124,15 @@ class Run {
   }
 
  private:
+  bool isRecordable(const QZExperimentResult& result, DiagnosticErrorPtr* error) const {
+    for (const auto& [key, value] : result.auxiliaryData()) {
+      if (isWithinLevels(value)) continue;
+      *error = errorOfDeepEntry(key, diagnostic_.experimentName);
+      return false;
+    }
+    return true;
+  }
+
   template <class Work>
   void inStage(Stage stage, Work&& work) {
     stage_ = stage;
@@ -137,7 +148,7 @@ class Run {
   bool attempt(const std::string& operation, Call&& call) {
     DiagnosticErrorPtr failure;
     if (callPlugin(operation, &failure, std::forward<Call>(call))) return true;
-    events_.onEvent(Failed{stage_, std::move(failure)});
+    events_.onEvent(Failed{stage_, errorWithinLevels(std::move(failure))});
     return false;
   }
 

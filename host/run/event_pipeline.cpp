@@ -21,7 +21,7 @@ std::unique_ptr<RecordWriter> lastRunRecord() {
   std::error_code ignored;
   std::filesystem::create_directories(file.parent_path(), ignored);
   try {
-    return std::make_unique<RecordWriter>(file);
+    return std::make_unique<RecordWriter>(file, RecordWriter::Unfinished::kReplace);  // the last run to begin counts
   } catch (const CommandError&) {
     return nullptr;
   }

@@ -1,5 +1,7 @@
 #include "host/run/isolation.h"
 
+#include "base/json/json_limits.h"
+#include "base/json/json_line.h"
 #include "base/text/input_error.h"
 #include "contract/message_format.h"
 #include "host/device/phone.h"
@@ -83,7 +85,7 @@ DiagnosticErrorPtr errorOf(const Supervised& supervised, const std::string& duri
     case SupervisionEnd::kInterrupted:
       return hostError(HostErrorCode::kInterrupted, during + " was interrupted" + stuck);
     case SupervisionEnd::kLineTooLong:
-      return hostError(HostErrorCode::kConnectionLost, during + " wrote more than " + std::to_string(kMaxEvent >> 20U) +
+      return hostError(HostErrorCode::kConnectionLost, during + " wrote more than " + std::to_string(kMaxLine >> 20U) +
                                                            " MiB in one line on its process's connection to quazor" +
                                                            stuck);
     case SupervisionEnd::kConnectionLost: break;
@@ -184,7 +186,7 @@ class ScanAttempt {
 
   bool take(std::string_view line) {
     try {
-      const Json said = Json::parse(line);
+      const Json said = parseJsonLine(line);
       const std::string what = memberOf(said, "says").get<std::string>();
       if (what == "loading") {
         loading_ = textFrom(memberOf(said, "plugin"));
@@ -280,7 +282,7 @@ class IsolatedRun {
   bool take(std::string_view line) {
     std::optional<RunEvent> event;
     try {
-      event = eventFrom(Json::parse(line));
+      event = eventFrom(parseJsonLine(line));
     } catch (const Json::exception&) {
     } catch (const InputError&) {
     }

@@ -96,7 +96,7 @@ class Supervisor {
       : child_(child),
         signals_(signals),
         supervision_(supervision),
-        connection_(child.connectionDescriptor(), kMaxEvent, LineReader::LongLines::kRefuse),
+        connection_(child.connectionDescriptor(), kMaxLine, LineReader::LongLines::kRefuse),
         output_(child.outputDescriptor(), kMaxOutputLength, LineReader::LongLines::kCut),
         requestsBefore_(signals.requestsToEnd()) {}
 

@@ -1,6 +1,7 @@
 // Supervises a child process: its output, its deadline and its end.
 #pragma once
 
+#include "base/json/json_limits.h"
 #include "host/system/child_process.h"
 
 #include <chrono>
@@ -11,9 +12,6 @@
 #include <string_view>
 
 namespace quazor {
-
-// The maximum line length on the connection, in bytes; a line may exceed it by a few bytes.
-inline constexpr std::size_t kMaxEvent = std::size_t{64} << 20U;
 
 // The callbacks for a child's output. All are called on the supervising thread.
 struct Supervision {
@@ -36,7 +34,7 @@ enum class SupervisionEnd {
   kDeadline,        // it was ended at the deadline
   kInterrupted,     // it was ended because this process was asked to end
   kConnectionLost,  // it was ended because it closed the connection or wrote an invalid line to it
-  kLineTooLong,     // it was ended because it wrote a line of more than kMaxEvent bytes
+  kLineTooLong,     // it was ended because it wrote a line of more than kMaxLine bytes
 };
 
 struct Supervised {

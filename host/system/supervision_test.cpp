@@ -242,11 +242,11 @@ TEST_F(SupervisionTest, EndsAChildThatWritesWhatIsNoLineOfItAndTakesNoMoreOfIt) 
 }
 
 TEST_F(SupervisionTest, EndsAChildThatWritesALineWithoutEndAndTakesNoMoreOfIt) {
-  EXPECT_EQ(kMaxEvent, std::size_t{64} * 1024 * 1024);
+  EXPECT_EQ(kMaxLine, std::size_t{64} * 1024 * 1024);
   EXPECT_EQ(run([](int connection) {
               say(connection, "one\n");
               const std::string piece(1 << 16, 'x');
-              for (std::size_t i = 0; i <= kMaxEvent; i += piece.size()) say(connection, piece);
+              for (std::size_t i = 0; i <= kMaxLine; i += piece.size()) say(connection, piece);
               hang();
             }),
             "line too long, signal 15 (SIGTERM)");
@@ -254,15 +254,14 @@ TEST_F(SupervisionTest, EndsAChildThatWritesALineWithoutEndAndTakesNoMoreOfIt) {
 }
 
 TEST_F(SupervisionTest, TellsOfALineWithoutEndOfAChildThatHasEnded) {
-  EXPECT_EQ(run([](int connection) { say(connection, std::string(kMaxEvent + 1, 'x')); }),
-            "line too long, exit code 0");
+  EXPECT_EQ(run([](int connection) { say(connection, std::string(kMaxLine + 1, 'x')); }), "line too long, exit code 0");
   EXPECT_THAT(lines_, IsEmpty());
 }
 
 TEST_F(SupervisionTest, TakesTheLongestLineOfTheConnection) {
-  EXPECT_EQ(run([](int connection) { say(connection, std::string(kMaxEvent, 'x') + "\n"); }), "ended, exit code 0");
+  EXPECT_EQ(run([](int connection) { say(connection, std::string(kMaxLine, 'x') + "\n"); }), "ended, exit code 0");
   ASSERT_EQ(lines_.size(), 1U);
-  EXPECT_EQ(lines_[0].size(), kMaxEvent);
+  EXPECT_EQ(lines_[0].size(), kMaxLine);
 }
 
 TEST_F(SupervisionTest, EndsTheChildWhenThisProcessIsAskedToEnd) {

@@ -1,0 +1,79 @@
+#include "host/command/output_check.h"
+
+#include "host/device/phone.h"
+#include "host/error/exit_code.h"
+#include "host/record/previous_run.h"
+#include "host/system/output_file.h"
+
+#include <sys/stat.h>
+
+#include <algorithm>
+#include <filesystem>
+#include <string>
+#include <system_error>
+#include <vector>
+
+namespace quazor {
+
+namespace {
+
+namespace fs = std::filesystem;
+
+// True if both names lead to one file, which need not exist yet.
+bool isSameFile(const fs::path& a, const fs::path& b) {
+  struct stat first {};
+  struct stat second {};
+  const bool isFirst = ::stat(a.c_str(), &first) == 0;
+  const bool isSecond = ::stat(b.c_str(), &second) == 0;
+  if (isFirst && isSecond) return first.st_dev == second.st_dev && first.st_ino == second.st_ino;
+  if (isFirst || isSecond) return false;
+  std::error_code error;
+  return fs::weakly_canonical(fs::absolute(a), error) == fs::weakly_canonical(fs::absolute(b), error);
+}
+
+// Devices and pipes may be written by several, and are no input that a run could damage.
+bool isSpecial(const fs::path& file) {
+  std::error_code error;
+  return fs::exists(file, error) && !fs::is_regular_file(file, error);
+}
+
+std::vector<fs::path> inputsOf(const Options& options, const Installation& installation, const RunStarted& began) {
+  std::vector<fs::path> inputs = options.records;
+  inputs.insert(inputs.end(), options.parameterFiles.begin(), options.parameterFiles.end());
+  inputs.insert(inputs.end(), began.plugins.begin(), began.plugins.end());
+  inputs.push_back(bindingNamed(began.phone).value_or(began.phone));
+  inputs.push_back(options.profile.empty() ? installation.defaultProfile() : options.profile);
+  inputs.push_back(options.failedOf);
+  // Every run reads or replaces the record of the last one.
+  if (options.command == Command::kRun) inputs.push_back(previousRunFile());
+  std::erase_if(inputs, [](const fs::path& file) { return file.empty(); });
+  return inputs;
+}
+
+}  // namespace
+
+void checkOutputs(const Options& options, const Installation& installation, const RunStarted& began) {
+  const std::vector<fs::path> inputs = inputsOf(options, installation, began);
+  std::vector<fs::path> outputs;
+  const auto check = [&](const fs::path& file) {
+    if (file.empty() || isSpecial(file)) return;
+    const auto isThis = [&file](const fs::path& other) { return isSameFile(file, other); };
+    if (std::any_of(outputs.begin(), outputs.end(), isThis)) {
+      throw CommandError(ExitCode::kUsage, "the file '" + file.string() + "' would be written twice");
+    }
+    if (std::any_of(inputs.begin(), inputs.end(), isThis)) {
+      throw CommandError(ExitCode::kUsage,
+                         "the file '" + file.string() + "' is an input of this run and would be overwritten");
+    }
+    outputs.push_back(file);
+  };
+  const auto checkReport = [&check](const fs::path& file) {
+    validateOutputFile(file);
+    check(file);
+  };
+  check(options.record);
+  if (!options.report.output.empty()) checkReport(options.report.output);
+  for (const OutputRequest& output : options.report.outputs) checkReport(output.file);
+}
+
+}  // namespace quazor

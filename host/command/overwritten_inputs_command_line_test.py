@@ -1,0 +1,67 @@
+"""Outputs that would overwrite what a run reads, or a record that another host is writing."""
+
+import fcntl
+import pathlib
+import unittest
+
+from command_line_fixture import WORKING, CommandLineTest, quazor
+
+
+class OverwrittenInputsTest(CommandLineTest):
+    """Outputs that name an input of the same run."""
+
+    def assert_untouched(self, file, result):
+        self.assert_refused(result, 64, "is an input of this run and would be overwritten")
+        self.assertEqual(file.read_bytes(), self.before[file])
+
+    def setUp(self):
+        super().setUp()
+        self.record = self.directory / "run.jsonl"
+        self.assertEqual(self.run_fake("--record", self.record).returncode, 0)
+        self.before = {file: file.read_bytes() for file in (self.record, self.phone)}
+
+    def test_the_record_that_is_analyzed(self):
+        symbolic, hard = self.directory / "symbolic", self.directory / "hard"
+        symbolic.symlink_to(self.record)
+        hard.hardlink_to(self.record)
+        for name in (self.record, symbolic, hard, f"{self.directory}/./run.jsonl"):
+            for option in (["--record", name], ["--output", name], ["--output", f"json:{name}"]):
+                with self.subTest(option):
+                    self.assert_untouched(self.record, quazor("analyze", self.record, *option))
+                    self.assert_untouched(self.record, quazor("run", "--only", "failed", "--of", self.record, *option))
+        self.assert_untouched(self.record, quazor("analyze", hard, "--record", symbolic))
+
+    def test_the_phone_the_profile_the_parameters_and_the_plug_in(self):
+        profile = self.write("profile.json", '{"schema": 1, "entries": []}')
+        parameters = self.write("parameters.json", "{}")
+        plugin = self.directory / "plugin.so"
+        plugin.write_bytes(pathlib.Path(WORKING).read_bytes())
+        for file in (self.phone, profile, parameters, plugin):
+            before = file.read_bytes()
+            for option in ("--record", "--output"):
+                with self.subTest([option, file]):
+                    result = quazor("run", "Fake.One", "--plugin", plugin, "--phone", self.phone, "--profile",
+                                    profile if file == profile else "none", "--set", "duration=1",
+                                    *(["--parameters", parameters] if file == parameters else []), option, file)
+                    self.assertIn(result.returncode, (64, 66), result.stdout)
+                    self.assertEqual(file.read_bytes(), before)
+
+    def test_the_record_of_the_last_run(self):
+        state = {"XDG_STATE_HOME": str(self.directory / "state")}
+        self.assertEqual(self.run_fake(env=state).returncode, 0)
+        last = self.directory / "state/quazor/last_run.jsonl"
+        self.before[last] = last.read_bytes()
+        self.assert_untouched(last, self.run_fake("--record", last, env=state))
+        self.assert_untouched(last, self.run_fake("--output", f"json:{last}", env=state))
+
+    def test_a_record_that_another_host_is_writing(self):
+        with open(self.record, "rb") as busy:
+            fcntl.flock(busy, fcntl.LOCK_EX)
+            result = self.run_fake("--record", self.record)
+            self.assert_refused(result, 73, "another process is writing it")
+            self.assertEqual(self.record.read_bytes(), self.before[self.record])
+        self.assertEqual(self.run_fake("--record", self.record).returncode, 0)
+
+
+if __name__ == "__main__":
+    unittest.main()
