@@ -151,7 +151,7 @@ class KilledHostTest(unittest.TestCase):
             return
         done = subprocess.run([PROGRAM, "verify", str(killed.record)], stdout=subprocess.PIPE,
                               stderr=subprocess.STDOUT, encoding="utf-8", check=False)
-        self.assertEqual(done.returncode, 0, done.stdout)
+        self.assertEqual(done.returncode, 3, done.stdout)
         self.assertIn(f"{len(killed.events)} event", done.stdout)
         self.assertIn(" 0 problems\nThe record is incomplete: the run did not end", done.stdout)
 

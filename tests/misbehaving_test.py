@@ -30,6 +30,7 @@ from pace import slowdown
 
 HOST = "QuazorHostErrorDomain"
 EXCEPTION, NOTHING_MEASURED, CANNOT_BE_JUDGED, CRASHED, EXITED, DEADLINE, CONNECTION_LOST = 2, 4, 5, 6, 7, 8, 9
+TOO_DEEP = 13
 WELL_BEHAVED = "WellBehaved"
 LATER_CRASH = "crashAfterTheFirstTime_on_load"  # the plug-in can be loaded once
 STAGES = ("load", "describe", "setup", "run", "teardown", "analyze")
@@ -100,6 +101,11 @@ def leave(name, stage="run", code=0, **more):
 def lose_connection(name, **more):
     return Case(name, CONNECTION_LOST, f"the stage run of {name} closed or overwrote its process's connection to quazor",
                 **more)
+
+
+def too_deep(name, **more):
+    return Case(name, TOO_DEEP, f"the entry 'deep' in the result of {name}Experiment is nested more than 500 levels deep",
+                stage="run", **more)
 
 
 def of_result(name, code, message):
@@ -249,8 +255,8 @@ CASES = (
     Case("LogFlood", check=all_lines, count=MANY),
     Case("ManyMeasurements", check=all_measurements, count=MANY),
     Case("ManyResults", check=all_results, count=MANY),
-    lose_connection("DeepValue", count=1000),
-    crash("DeepValue", count=1_000_000),
+    too_deep("DeepValue", count=1000),
+    too_deep("DeepValue", count=1_000_000),
     Case("OddTexts", check=odd_texts),
     of_result("NotANumber", CANNOT_BE_JUDGED, ANSWER_IS + "nan"),
     of_result("Infinite", CANNOT_BE_JUDGED, ANSWER_IS + "inf"),

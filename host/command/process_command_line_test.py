@@ -140,7 +140,7 @@ class ProcessTest(CommandLineTest):
         record = self.directory / "run.jsonl"
         result = self.run_unruly(1, "--in-process", "--record", record)
         self.assertEqual(result.returncode, -signal.SIGABRT)
-        self.assertEqual(quazor("verify", record).returncode, 0)
+        self.assertEqual(quazor("verify", record).returncode, 3)
 
     def test_a_plugin_that_cannot_be_loaded_is_told(self):
         text = f"quazor: loading the plug-in '{FATAL}' crashed: its process was terminated by signal 6 (SIGABRT)\n"

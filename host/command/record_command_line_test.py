@@ -495,15 +495,6 @@ class OutputsTest(RecordTest):
         self.assert_refused(quazor("list", "--plugin", WORKING, "--output", "a", "--output", "b"), 64,
                             "this command writes only one file")
 
-    def test_a_format_that_is_none(self):
-        result = self.run_fake("--output", "xml:report", cwd=self.directory)
-        self.assert_refused(result, 64, "unknown format 'xml' (for a file of this name, write './xml:report')")
-        result = self.run_fake("--output", "jnuit:report", cwd=self.directory)
-        self.assert_refused(result, 64, "'./jnuit:report'); did you mean 'junit'?")
-        result = self.run_fake("--output", "./xml:report", cwd=self.directory)
-        self.assertEqual(result.returncode, 0, result.stderr)
-        self.assertIn("Fake.One", pathlib.Path(self.directory / "xml:report").read_text())
-
 
 if __name__ == "__main__":
     unittest.main()

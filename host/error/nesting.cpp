@@ -49,7 +49,8 @@ DiagnosticErrorPtr errorWithinLevels(DiagnosticErrorPtr error) {
   DiagnosticErrorPtr rebuilt =
       hostError(HostErrorCode::kTooDeep, "the rest of the error is left out, because it is " + limitText());
   for (auto one = kept.rbegin(); one != kept.rend(); ++one) {
-    rebuilt = errorWithMessage((*one)->domain(), (*one)->code(), (*one)->localizedDescription(), std::move(rebuilt));
+    const DiagnosticError& same = **one;
+    rebuilt = errorWithMessage(same.domain(), same.code(), same.localizedDescription(), std::move(rebuilt));
   }
   return rebuilt;
 }

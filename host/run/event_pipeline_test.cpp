@@ -105,9 +105,11 @@ TEST_F(EventPipelineTest, KeepsTheLastRunOnlyWhenItShould) {
 
 TEST_F(EventPipelineTest, RunsWithoutAPlaceForTheLastRun) {
   directory_.write("state", "a file where a directory should be");
-  EventPipeline events(keeping(), console_);
-  events.onEvent(runOf({"A"}));
-  perform(events, "A", 90);
+  {
+    EventPipeline events(keeping(), console_);
+    events.onEvent(runOf({"A"}));
+    perform(events, "A", 90);
+  }
   EXPECT_EQ(runIn(record_).records.size(), 1U);
   const EnvironmentVariable none("XDG_STATE_HOME", nullptr);
   const EnvironmentVariable noHome("HOME", nullptr);

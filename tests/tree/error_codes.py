@@ -20,7 +20,7 @@ MAKERS = {"fail": (1, 2, 4, 5), "makeError": (0, 1, 2, 3), "errorWithMessage": (
 # These files declare and define the functions above.
 MAKERS_FILES = {"contract/diagnostic_error.h", "contract/diagnostic_error.cpp"}
 # This file recreates errors from a record.
-COPIERS = {"host/record/lossless_json.cpp"}
+COPIERS = {"host/error/nesting.cpp", "host/record/lossless_json.cpp"}
 
 TOKEN = re.compile(
     r'''(?P<skip>\s+|//[^\n]*|/\*.*?\*/|^[ \t]*\#(?:[^\n\\]|\\.)*)
@@ -254,8 +254,10 @@ class Collector:
 
     @staticmethod
     def _is_passed_on(source, domain, code):
-        """An error of a scenario, whose author chose domain and code."""
+        """An error of a scenario, whose author chose domain and code, or a copy of another error."""
         texts = ["".join(token.text for token in argument) for argument in (domain, code)]
+        if source.name in COPIERS:
+            return texts[0].endswith(".domain()") and texts[1] == texts[0][:-len("domain()")] + "code()"
         return (source.name.startswith(("backends/faults/", "backends/simulated/")) and texts[0].endswith(".error->domain")
                 and texts[1] == texts[0][:-len("domain")] + "code")
 

@@ -1,4 +1,4 @@
-"""Outputs that would overwrite what a run reads, or a record that another host is writing."""
+"""Files of a run: outputs that would overwrite what it reads, a record that another host is writing, names of formats."""
 
 import fcntl
 import pathlib
@@ -7,7 +7,7 @@ import unittest
 from command_line_fixture import WORKING, CommandLineTest, quazor
 
 
-class OverwrittenInputsTest(CommandLineTest):
+class OutputFilesTest(CommandLineTest):
     """Outputs that name an input of the same run."""
 
     def assert_untouched(self, file, result):
@@ -61,6 +61,15 @@ class OverwrittenInputsTest(CommandLineTest):
             self.assert_refused(result, 73, "another process is writing it")
             self.assertEqual(self.record.read_bytes(), self.before[self.record])
         self.assertEqual(self.run_fake("--record", self.record).returncode, 0)
+
+    def test_a_format_that_is_none(self):
+        result = self.run_fake("--output", "xml:report", cwd=self.directory)
+        self.assert_refused(result, 64, "unknown format 'xml' (for a file of this name, write './xml:report')")
+        result = self.run_fake("--output", "jnuit:report", cwd=self.directory)
+        self.assert_refused(result, 64, "'./jnuit:report'); did you mean 'junit'?")
+        result = self.run_fake("--output", "./xml:report", cwd=self.directory)
+        self.assertEqual(result.returncode, 0, result.stderr)
+        self.assertIn("Fake.One", pathlib.Path(self.directory / "xml:report").read_text())
 
 
 if __name__ == "__main__":
