@@ -256,7 +256,7 @@ CASES = (
     Case("ManyMeasurements", check=all_measurements, count=MANY),
     Case("ManyResults", check=all_results, count=MANY),
     too_deep("DeepValue", count=1000),
-    too_deep("DeepValue", count=1_000_000),
+    too_deep("DeepValue", count=200_000),
     Case("OddTexts", check=odd_texts),
     of_result("NotANumber", CANNOT_BE_JUDGED, ANSWER_IS + "nan"),
     of_result("Infinite", CANNOT_BE_JUDGED, ANSWER_IS + "inf"),
