@@ -34,8 +34,8 @@ void destroy(Content&& content) {
   Waiting& contents = waiting == nullptr ? own : *waiting;
   try {
     contents.emplace_back(std::move(content));
-  } catch (const std::bad_alloc&) {
-    return;  // the caller's object ends by itself, with recursion
+  } catch (const std::bad_alloc&) {  // GCOV_EXCL_LINE: only without memory
+    return;                          // GCOV_EXCL_LINE: the caller's object ends by itself, with recursion
   }
   if (waiting != nullptr) return;
   waiting = &contents;
