@@ -28,7 +28,7 @@ bool holdsNested(const Dictionary& entries) {
 }
 
 template <class Content>
-void destroy(Content&& content) {
+void destroy(Content& content) {
   if (!holdsNested(content)) return;  // the caller's object ends by itself
   Waiting own;
   Waiting& contents = waiting == nullptr ? own : *waiting;
@@ -48,7 +48,7 @@ void destroy(Content&& content) {
 
 }  // namespace
 
-void destroyFlat(Array&& elements) noexcept { destroy(std::move(elements)); }
-void destroyFlat(Dictionary&& entries) noexcept { destroy(std::move(entries)); }
+void destroyFlat(Array&& elements) noexcept { destroy(elements); }
+void destroyFlat(Dictionary&& entries) noexcept { destroy(entries); }
 
 }  // namespace QUAZOR_CONTRACT

@@ -24,7 +24,7 @@ struct Holder {
 
 template <class Content>
 std::shared_ptr<const Content> held(Content&& content) {
-  auto holder = std::make_shared<Holder<Content>>(std::move(content));
+  auto holder = std::make_shared<Holder<Content>>(std::forward<Content>(content));
   const Content* const place = &holder->content;
   return {std::move(holder), place};
 }
