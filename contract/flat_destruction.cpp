@@ -29,13 +29,13 @@ bool holdsNested(const Dictionary& entries) {
 
 template <class Content>
 void destroy(Content& content) {
-  if (!holdsNested(content)) return;  // the caller's object ends by itself
+  if (!holdsNested(content)) return;  // the caller destroys it without much recursion
   Waiting own;
   Waiting& contents = waiting == nullptr ? own : *waiting;
   try {
     contents.emplace_back(std::move(content));
   } catch (const std::bad_alloc&) {  // GCOV_EXCL_LINE: only without memory
-    return;                          // GCOV_EXCL_LINE: the caller's object ends by itself, with recursion
+    return;                          // GCOV_EXCL_LINE: the caller destroys it, with recursion
   }
   if (waiting != nullptr) return;
   waiting = &contents;

@@ -5,7 +5,7 @@
 
 namespace quazor {
 
-// Nested levels of a value that a diagnostic gives: more than any needs, and small enough for the stack.
+// Nested levels of a value from a diagnostic: more than any diagnostic needs, and few enough for the stack.
 inline constexpr int kMaxValueLevels = 500;
 
 // A line that a program wrote: an event in a record or on the connection to a plug-in's process. Each level of a value

@@ -117,7 +117,7 @@ int isParentDumpable() {
 // Returns the descriptor of the child's end of the connection.
 int becomeChild(pid_t parent, const WatchedSignals& signals, const Pipe& connection, const Pipe& output,
                 std::optional<std::uint64_t> memory) {
-  ::setsid();  // a terminal of its parent is not its own
+  ::setsid();  // detaches the child from its parent's terminal
   ::prctl(PR_SET_DUMPABLE, isParentDumpable());
   ::prctl(PR_SET_PDEATHSIG, SIGKILL);
   if (::getppid() != parent) ::_exit(EXIT_FAILURE);  // the parent ended before the call above
