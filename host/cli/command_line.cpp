@@ -46,7 +46,7 @@ constexpr const char* kExitCodes = R"(Exit codes:
   130  interrupted)";
 
 // Default memory limit of a plug-in process: more than any diagnostic needs, less than a bench machine has.
-constexpr std::uint64_t kMebibyte = 1024 * 1024;
+constexpr std::uint64_t kMebibyte = std::uint64_t{1024} * 1024;
 constexpr std::uint64_t kDefaultMebibytes = 4096;
 
 // Arguments as CLI11 collects them, before validation.

@@ -17,7 +17,7 @@ namespace quazor {
 namespace {
 
 std::vector<std::string> wantedScenarios(const Options& options, const Installation& installation) {
-  const std::vector<std::string> all = installation.scenarioNames();
+  std::vector<std::string> all = installation.scenarioNames();
   if (options.names.empty()) return all;
   std::vector<std::string> wanted;
   for (const std::string& name : options.names) {

@@ -21,6 +21,7 @@ namespace {
 
 std::vector<DeclaredFault> declared(const std::vector<FaultStatus>& statuses) {
   std::vector<DeclaredFault> faults;
+  faults.reserve(statuses.size());
   for (const FaultStatus& status : statuses) faults.push_back({faultJson(status.fault), status.fired});
   return faults;
 }

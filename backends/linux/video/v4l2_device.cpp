@@ -53,7 +53,7 @@ std::shared_ptr<V4l2Device> V4l2Device::open(std::shared_ptr<V4l2Api> kernel, co
     failSystemCall(error, "open", path, -descriptor);
     return nullptr;
   }
-  const std::shared_ptr<V4l2Device> node(new V4l2Device(std::move(kernel), path, descriptor));
+  std::shared_ptr<V4l2Device> node(new V4l2Device(std::move(kernel), path, descriptor));
   if (!node->call(VIDIOC_QUERYCAP, "VIDIOC_QUERYCAP", &node->capability_, error)) return nullptr;
   node->listControls();
   return node;

@@ -77,6 +77,7 @@ std::vector<V4l2DeviceInfo> videoNodes(const std::shared_ptr<V4l2Api>& kernel, c
   }
   std::ranges::sort(numbered, {}, [](const auto& one) { return one.first; });
   std::vector<V4l2DeviceInfo> nodes;
+  nodes.reserve(numbered.size());
   for (auto& [number, node] : numbered) nodes.push_back(std::move(node));
   return nodes;
 }

@@ -27,6 +27,7 @@ class PixelBufferPool final {
     std::size_t camera = 0;
     std::uint64_t frame = 0;
 
+    // NOLINTNEXTLINE(modernize-use-nullptr): the check takes the 0 of the defaulted comparison for a pointer
     friend auto operator<=>(const Held&, const Held&) = default;
   };
 
