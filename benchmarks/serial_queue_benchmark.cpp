@@ -107,7 +107,7 @@ void registerThroughput(const std::string& name) {
       ->Unit(benchmark::kMillisecond);
 }
 
-BENCHMARK(wakeUp)->Name("wake_up")->Iterations(200)->Unit(benchmark::kMicrosecond);
+BENCHMARK(wakeUp)->Name("wake_up")->Iterations(500)->Unit(benchmark::kMicrosecond);
 
 }  // namespace
 }  // namespace quazor
