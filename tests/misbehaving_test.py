@@ -33,6 +33,7 @@ EXCEPTION, NOTHING_MEASURED, CANNOT_BE_JUDGED, CRASHED, EXITED, DEADLINE, CONNEC
 TOO_DEEP = 13
 WELL_BEHAVED = "WellBehaved"
 LATER_CRASH = "crashAfterTheFirstTime_on_load"  # the plug-in can be loaded once
+LATER_CRASH_DIAGNOSTIC = "Loaded.crashAfterTheFirstTime"
 STAGES = ("load", "describe", "setup", "run", "teardown", "analyze")
 LIMIT = 1  # seconds, for a stage that hangs
 GRACE = 0.5  # seconds between SIGTERM and SIGKILL
@@ -51,6 +52,7 @@ class Case:
     stage: str = "run"
     log: tuple = ()  # lines that the record contains in addition to the first one
     plugins: tuple = ("misbehaving",)
+    options: tuple = ()
     shell: str = 'exec "$@"'  # runs the program
     hangs: bool = False  # it exceeds the deadline
     grace: bool = False  # and ignores SIGTERM
@@ -122,6 +124,10 @@ def described(name, code, message, plugin="misbehaving_in_description", **more):
     return Case(name, code, message, stage="describe", plugins=(plugin,), **more)
 
 
+def after_results(name, code, message, **more):
+    return Case(name, code, f"{name}, after its results, {message}", stage="analyze", **more)
+
+
 def texts(outcome, name, event, key):
     return [one[key] for one in outcome.about(name) if one["event"] == event]
 
@@ -171,6 +177,10 @@ def odd_texts(outcome, test):
     test.assertNotIn("\x1b", outcome.out)
 
 
+def no_forged_result(outcome, test):
+    test.assertEqual(texts(outcome, "ForgedPass", "found", "results"), [])
+
+
 def no_lines_after_the_end(outcome, test):
     events = [one["event"] for one in outcome.about("LogAfterTheEnd")]
     test.assertEqual(events[-2:], ["diagnosticCompleted", "diagnosticEnded"])
@@ -189,7 +199,12 @@ CASES = (
     on_load("throwException", CRASHED,
             "throwException_on_load.so' crashed: its process was terminated by signal 6 (SIGABRT)"),
 
-    crash("LoadedWithMisbehaviour", "load", plugins=(LATER_CRASH,)),
+    on_load("forgeScan", CONNECTION_LOST,
+            "forgeScan_on_load.so' closed or overwrote its process's connection to quazor"),
+
+    described(LATER_CRASH_DIAGNOSTIC, CRASHED, f"{LATER_CRASH}.so' crashed: "
+              "its process was terminated by signal 11 (SIGSEGV)", plugin=LATER_CRASH),
+    crash("Loaded.crashAfterTheSecondTime", "load", plugins=("crashAfterTheSecondTime_on_load",)),
 
     described("CrashWhenDescribed", CRASHED, "describing CrashWhenDescribed crashed: "
               "its process was terminated by signal 11 (SIGSEGV)"),
@@ -217,6 +232,10 @@ CASES = (
     leave("LeaveAtOnce"),
     leave("LeaveWithCode", "analyze", code=7),
     leave("LeaveWithCode", "analyze", code=7, shell=IGNORES_CHILDREN),
+    after_results("CrashWithThePhone", CRASHED, "crashed: its process was terminated by signal 11 (SIGSEGV)"),
+    after_results("LeaveWithThePhone", EXITED, "ended its own process with exit code 7"),
+    after_results("HangWithThePhone", DEADLINE, f"exceeded its deadline of {LIMIT} s", hangs=True),
+    Case("LeaveTasks", options=("--realtime",)),
     hang("HangInSetup", "setup"),
     hang("HangInRun"),
     hang("BusyLoopInRun"),
@@ -236,6 +255,8 @@ CASES = (
     lose_connection("GarbageEverywhere"),
     lose_connection("HalfALineEverywhere"),
     lose_connection("ForeignEventEverywhere"),
+    lose_connection("ForgedPass", check=no_forged_result),
+    lose_connection("ForgedStages"),
     Case("GarbageToOutput", log=OUTPUT),
     Case("FloodOfLines", floods=True, check=dropped_lines),
     Case("FloodWithoutLines", floods=True, check=record_stays_small),
@@ -270,21 +291,22 @@ def events_in(file):
     return [json.loads(line) for line in file.read_text(encoding="utf-8").splitlines()]
 
 
-def run(names, plugins, options=(), shell='exec "$@"'):
-    """Runs the diagnostics in one call of the program."""
-    with tempfile.TemporaryDirectory() as directory:
-        record = pathlib.Path(directory) / "record.jsonl"
+def run(names, plugins, options=(), shell='exec "$@"', directory=None):
+    """Runs the diagnostics in one call of the program; in `directory`, if given, with relative names of plug-ins."""
+    folder = pathlib.Path() if directory else PLUGINS
+    with tempfile.TemporaryDirectory() as state:
+        record = pathlib.Path(state) / "record.jsonl"
         command = ["sh", "-c", shell, "sh", PROGRAM, "run", *names, *options, "--record", str(record)]
         for plugin in plugins:
-            command += ["--plugin", str(PLUGINS / f"{plugin}.so")]
+            command += ["--plugin", str(folder / f"{plugin}.so")]
         # The sanitizers must not intercept crashes.
         sanitizers = "handle_segv=0:handle_abort=0:die_after_fork=0"
         environment = environment_with_marker(
-            XDG_STATE_HOME=directory, MISBEHAVIOUR_STATE=os.path.join(directory, "state"),
+            XDG_STATE_HOME=state, MISBEHAVIOUR_STATE=os.path.join(state, "state"),
             ASAN_OPTIONS=sanitizers + ":detect_leaks=0", TSAN_OPTIONS=sanitizers)
         slowdown_before = slowdown()
         begin = time.monotonic()
-        done = subprocess.run(command, stdin=subprocess.DEVNULL, stdout=subprocess.PIPE, stderr=subprocess.PIPE,
+        done = subprocess.run(command, cwd=directory, stdin=subprocess.DEVNULL, stdout=subprocess.PIPE, stderr=subprocess.PIPE,
                               env=environment, encoding="utf-8", errors="surrogateescape",
                               timeout=300 if MANY < 1_000_000 else 3000, check=False)
         seconds = time.monotonic() - begin
@@ -302,7 +324,7 @@ def memory_options(case):
 
 
 def outcome_of(case):
-    options = [*memory_options(case)]
+    options = [*memory_options(case), *case.options]
     if case.hangs:
         options += ["--deadline", f"{case.stage}={LIMIT}"]
     if case.count:
@@ -353,21 +375,31 @@ class MisbehavingTest(unittest.TestCase):
         self.assertEqual(outcome.about(WELL_BEHAVED)[-1]["verdict"], "pass")
 
     def test_a_plug_in_that_crashes_at_a_later_load_harms_its_own_diagnostic_only(self):
-        outcome = run([WELL_BEHAVED, "LoadedWithMisbehaviour"], [LATER_CRASH, "well_behaved"])
-        self.assertEqual(outcome.code, 2, outcome.err)
-        self.assertEqual(outcome.about(WELL_BEHAVED)[-1]["verdict"], "pass")
-        failed = [one for one in outcome.about("LoadedWithMisbehaviour") if one["event"] == "failed"]
-        self.assertEqual([(one["stage"], one["error"]["code"]) for one in failed], [("load", CRASHED)])
+        for way, stage in (("FirstTime", "describe"), ("SecondTime", "load")):
+            name = f"Loaded.crashAfterThe{way}"
+            outcome = run([WELL_BEHAVED, name], [f"crashAfterThe{way}_on_load", "well_behaved"])
+            self.assertEqual(outcome.code, 2, outcome.err)
+            self.assertEqual(outcome.about(WELL_BEHAVED)[-1]["verdict"], "pass")
+            failed = [one for one in outcome.about(name) if one["event"] == "failed"]
+            self.assertEqual([(one["stage"], one["error"]["code"]) for one in failed], [(stage, CRASHED)])
 
-    def test_a_plug_in_that_crashes_when_it_is_loaded_again_to_describe_others_is_left_out(self):
+    def test_a_plug_in_is_not_loaded_again_to_describe_others(self):
         outcome = run(["CrashWhenDescribed", "ExitWhenDescribed", WELL_BEHAVED],
                       [LATER_CRASH, "misbehaving_in_description", "well_behaved"])
         self.assertEqual(outcome.code, 2, outcome.err)
-        for name, stage, code in ((f"{LATER_CRASH}.so", "load", CRASHED), ("CrashWhenDescribed", "describe", CRASHED),
-                                  ("ExitWhenDescribed", "describe", EXITED)):
-            failed = [one for one in outcome.about(name) if one["event"] == "failed"]
-            self.assertEqual([(one["stage"], one["error"]["code"]) for one in failed], [(stage, code)], name)
+        failed = [one for one in outcome.events if one["event"] == "failed"]
+        self.assertEqual([(one["stage"], one["error"]["code"]) for one in failed],
+                         [("describe", CRASHED), ("describe", EXITED)])
         self.assertEqual(outcome.about(WELL_BEHAVED)[-1]["verdict"], "pass")
+
+    def test_a_plug_in_that_aborts_later_harms_no_other(self):
+        outcome = run([WELL_BEHAVED, "Loaded.takeASecond"],
+                      ["abortLater_on_load", "takeASecond_on_load", "well_behaved"])
+        self.assertEqual(outcome.code, 0, outcome.out + outcome.err)
+
+    def test_a_plug_in_that_changes_the_directory_harms_no_other(self):
+        outcome = run([WELL_BEHAVED], ["changeDirectory_on_load", "well_behaved"], directory=PLUGINS)
+        self.assertEqual(outcome.code, 0, outcome.out + outcome.err)
 
     def check(self, case, outcome):
         events = outcome.about(case.name)

@@ -152,6 +152,16 @@ class ProcessTest(CommandLineTest):
         ran = quazor("run", "--all", "--plugin", FATAL, "--phone", self.phone, "--profile", "none")
         self.assertEqual(ran.returncode, 2)
 
+    def test_a_plugin_cannot_end_a_run_without_an_error(self):
+        for line in ('{"says":"refused","code":0,"text":"nothing to do"}', '{"says":"registered","registrations":[]}',
+                     '{"says":"catalogue","catalogue":[]}\n{"says":"done"}'):
+            with self.subTest(line):
+                ran = quazor("run", "--all", "--plugin", FATAL, "--phone", self.phone, "--profile", "none", "--format",
+                             "json", env={"FATAL_PLUGIN": f"={line}"})
+                self.assertEqual(ran.returncode, 2, ran.stderr)
+                record, = json.loads(ran.stdout)["diagnostics"]
+                self.assertEqual((record["name"], record["error"]["code"]), ("fatal_plugin.so", 9))
+
     def test_what_a_plugin_prints_is_kept_apart_from_the_report(self):
         result = self.run_unruly(7, "--format", "json")
         self.assertEqual(result.returncode, 0, result.stderr)

@@ -48,6 +48,10 @@ std::vector<Profile> profilesOf(const Options& options, const Installation& inst
   return profiles;
 }
 
+[[noreturn]] void refuseInterrupted() {
+  throw CommandError(ExitCode::kInterrupted, "interrupted while loading the plug-ins");
+}
+
 // Requests the descriptions that are needed to check the profiles.
 void describeForProfiles(const Options& options, const Installation& installation, const std::vector<Profile>& profiles,
                          std::vector<DescribedDiagnostic>& catalogue) {
@@ -63,14 +67,8 @@ void describeForProfiles(const Options& options, const Installation& installatio
     }
     return;
   }
-  const PluginScan scan = scanOf(options, installation,
-                                 [&undescribed](const std::vector<Diagnostic>& /*catalogue*/) { return undescribed; });
-  for (DescribedDiagnostic& one : catalogue) {
-    for (const DescribedDiagnostic& asked : scan.catalogue) {
-      if (asked.description.isAsked && contains({asked.diagnostic}, one.diagnostic))
-        one.description = asked.description;
-    }
-  }
+  WatchedSignals signals;
+  if (!describeIsolated(isolationOf(options, installation), signals, undescribed, catalogue)) refuseInterrupted();
 }
 
 }  // namespace
@@ -93,7 +91,7 @@ PluginScan scanOf(const Options& options, const Installation& installation, cons
   }
   WatchedSignals signals;
   scan = scanPlugins(isolation, signals, described);
-  if (scan.interrupted) throw CommandError(ExitCode::kInterrupted, "interrupted while loading the plug-ins");
+  if (scan.interrupted) refuseInterrupted();
   return scan;
 }
 

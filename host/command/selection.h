@@ -3,7 +3,7 @@
 
 #include "host/cli/command_line.h"
 #include "host/cli/installation.h"
-#include "host/run/isolation.h"
+#include "host/run/plugin_scan.h"
 
 #include <vector>
 
@@ -17,7 +17,7 @@ struct Selection {
 // The plug-ins that the options name, or the installed one, and the limits of their processes.
 IsolationOptions isolationOf(const Options& options, const Installation& installation);
 
-// Scans the plug-ins in a separate process, or in this one with --in-process. `described` chooses the diagnostics that
+// Scans the plug-ins in separate processes, or in this one with --in-process. `described` chooses the diagnostics that
 // are asked for their descriptions. Throws a CommandError if a plug-in cannot be loaded, and kInterrupted on an
 // interrupt.
 PluginScan scanOf(const Options& options, const Installation& installation, const DiagnosticChoice& described);

@@ -40,6 +40,11 @@ bool isWanted(const Diagnostic& one, Wanted wanted) {
   return one.usedBy.empty();
 }
 
+// A diagnostic and an experiment on its own may have the same name.
+bool isSame(const Diagnostic& one, const Diagnostic& other) {
+  return one.name == other.name && one.experimentOnly == other.experimentOnly;
+}
+
 // The entries that an exact name can select; a pattern can select them only if it matches no wanted entry.
 std::vector<Diagnostic> reachable(const std::vector<Diagnostic>& catalogue, Wanted wanted) {
   return wanted == Wanted::kDescribable ? catalogue : allOf(catalogue, wanted);
@@ -90,6 +95,13 @@ std::vector<Diagnostic> catalogueOf(const QZLab& lab) {
         {one.name, {}, one.name, {}, one.makeExperiment, nullptr, true, diagnosticsWith(lab, one.name)});
   }
   return catalogue;
+}
+
+std::optional<Diagnostic> registeredDiagnostic(const QZLab& lab, const Diagnostic& wanted) {
+  for (Diagnostic& one : catalogueOf(lab)) {
+    if (isSame(one, wanted)) return std::move(one);
+  }
+  return std::nullopt;
 }
 
 DiagnosticDescription describeDiagnostic(const Diagnostic& diagnostic) {
@@ -149,9 +161,8 @@ std::vector<Diagnostic> selectDiagnostics(const std::vector<Diagnostic>& catalog
 }
 
 bool contains(const std::vector<Diagnostic>& diagnostics, const Diagnostic& wanted) {
-  return std::any_of(diagnostics.begin(), diagnostics.end(), [&wanted](const Diagnostic& one) {
-    return one.name == wanted.name && one.experimentOnly == wanted.experimentOnly;
-  });
+  return std::any_of(diagnostics.begin(), diagnostics.end(),
+                     [&wanted](const Diagnostic& one) { return isSame(one, wanted); });
 }
 
 bool matchesName(const std::string& pattern, const std::string& name) {

@@ -41,6 +41,9 @@ enum class Wanted { kDiagnostics, kExperiments, kDescribable };
 // experiment or analysis is not registered.
 std::vector<Diagnostic> catalogueOf(const QZLab& lab);
 
+// The entry of the lab's catalogue that is the same as `wanted`, with its factories; nothing if there is none.
+std::optional<Diagnostic> registeredDiagnostic(const QZLab& lab, const Diagnostic& wanted);
+
 // Creates the experiment and, for a diagnostic, the analysis, and asks for their descriptions, on a platform without a
 // phone. An exception of the plug-in is stored in `error`.
 DiagnosticDescription describeDiagnostic(const Diagnostic& diagnostic);

@@ -18,36 +18,12 @@ namespace quazor {
 
 namespace {
 
-[[noreturn]] void refusePlugin(const std::filesystem::path& file, const std::string& what) {
-  throw CommandError(ExitCode::kCannotRead, "the plug-in '" + file.string() + "' " + what);
-}
-
-[[noreturn]] void refuseUnlinkable(const std::filesystem::path& file, const std::string& message) {
+[[noreturn]] void refuseUnlinkable(const std::string& message) {
   const std::optional<int> version = contractVersionIn(message);
-  if (!version || *version == QUAZOR_CONTRACT_VERSION) refusePlugin(file, "cannot be loaded: " + message);
-  refusePlugin(file, "was built against version " + std::to_string(*version) +
-                         " of the plug-in contract, but this program has version " +
-                         std::to_string(QUAZOR_CONTRACT_VERSION) + "; rebuild the plug-in against this version");
-}
-
-void loadPlugin(const std::filesystem::path& file) {
-  try {
-    validateSharedObject(file);
-  } catch (const InputError& problem) {
-    refusePlugin(file, problem.what());
-  }
-  const QZLab& lab = QZLab::defaultLab();
-  const std::size_t registered = lab.registrations().size();
-  const std::size_t refused = lab.refusedNames().size();
-  // An absolute path contains a slash, so the linker opens this file and does not search for it.
-  if (dlopen(std::filesystem::absolute(file).c_str(), RTLD_NOW | RTLD_LOCAL) == nullptr) {
-    const char* message = dlerror();
-    refuseUnlinkable(file, message == nullptr ? "the dynamic linker gives no reason" : message);
-  }
-  if (lab.refusedNames().size() > refused) {
-    refusePlugin(file, "registers the name '" + lab.refusedNames()[refused] + "', which is already taken");
-  }
-  if (lab.registrations().size() == registered) refusePlugin(file, "registers nothing");
+  if (!version || *version == QUAZOR_CONTRACT_VERSION) throw InputError("cannot be loaded: " + message);
+  throw InputError("was built against version " + std::to_string(*version) +
+                   " of the plug-in contract, but this program has version " + std::to_string(QUAZOR_CONTRACT_VERSION) +
+                   "; rebuild the plug-in against this version");
 }
 
 bool isSameFile(const std::filesystem::path& a, const std::filesystem::path& b) {
@@ -63,51 +39,91 @@ std::vector<std::string> namesOf(const QZLab& lab, QZLab::Kind kind) {
   return names;
 }
 
-void checkPart(const LoadedPlugin& plugin, const std::string& diagnostic, QZLab::Kind kind, const std::string& name) {
-  const QZLab& lab = QZLab::defaultLab();
+void checkPart(const QZLab& lab, const LoadedPlugin& plugin, const std::string& diagnostic, QZLab::Kind kind,
+               const std::string& name) {
   if (lab.find(kind, name) != nullptr) return;
   const std::string part = kind == QZLab::Kind::kExperiment ? "experiment" : "analysis";
   refusePlugin(plugin.file, "registers the diagnostic '" + diagnostic + "' with the " + part + " '" + name +
                                 "', which is not registered" + didYouMean(name, namesOf(lab, kind)));
 }
 
-void checkDiagnostics(const std::vector<LoadedPlugin>& plugins) {
-  const std::vector<QZLab::Registration>& registrations = QZLab::defaultLab().registrations();
-  std::size_t at = 0;
-  for (const LoadedPlugin& plugin : plugins) {
-    for (; at < plugin.last; ++at) {
-      const QZLab::Registration& one = registrations[at];
-      if (one.kind != QZLab::Kind::kDiagnostic) continue;
-      checkPart(plugin, one.name, QZLab::Kind::kExperiment, one.experimentName);
-      checkPart(plugin, one.name, QZLab::Kind::kAnalysis, one.analysisName);
-    }
-  }
-}
-
 std::vector<LoadedPlugin> loadEach(const std::vector<std::filesystem::path>& files,
-                                   const std::function<void(const std::filesystem::path& file)>& isNext) {
+                                   const std::function<void()>& isNext) {
+  // A plug-in may change the working directory.
+  const std::vector<std::filesystem::path> distinct = distinctFiles(files);
+  std::vector<std::filesystem::path> absolute;
+  for (const std::filesystem::path& file : distinct) absolute.push_back(std::filesystem::absolute(file));
   std::vector<LoadedPlugin> loaded;
-  for (const std::filesystem::path& file : files) {
-    const bool again = std::any_of(loaded.begin(), loaded.end(),
-                                   [&file](const LoadedPlugin& other) { return isSameFile(other.file, file); });
-    if (again) continue;
-    if (isNext) isNext(file);
-    loadPlugin(file);
-    loaded.push_back({file, QZLab::defaultLab().registrations().size()});
+  for (std::size_t i = 0; i < distinct.size(); ++i) {
+    if (isNext) isNext();
+    try {
+      loadPlugin(absolute[i]);
+    } catch (const InputError& problem) {
+      refusePlugin(distinct[i], problem.what());
+    }
+    loaded.push_back({distinct[i], QZLab::defaultLab().registrations().size()});
   }
   return loaded;
 }
 
 }  // namespace
 
-std::vector<LoadedPlugin> loadPlugins(const std::vector<std::filesystem::path>& files,
-                                      const std::function<void(const std::filesystem::path& file)>& isNext) {
-  std::vector<LoadedPlugin> loaded = loadEach(files, isNext);
-  checkDiagnostics(loaded);
+void refusePlugin(const std::filesystem::path& file, const std::string& what) {
+  throw CommandError(ExitCode::kCannotRead, "the plug-in '" + file.string() + "' " + what);
+}
+
+std::vector<std::filesystem::path> distinctFiles(const std::vector<std::filesystem::path>& files) {
+  std::vector<std::filesystem::path> distinct;
+  for (const std::filesystem::path& file : files) {
+    const bool again = std::any_of(distinct.begin(), distinct.end(),
+                                   [&file](const std::filesystem::path& other) { return isSameFile(other, file); });
+    if (!again) distinct.push_back(file);
+  }
+  return distinct;
+}
+
+void loadPlugin(const std::filesystem::path& file) {
+  validateSharedObject(file);
+  const QZLab& lab = QZLab::defaultLab();
+  const std::size_t registered = lab.registrations().size();
+  const std::size_t refused = lab.refusedNames().size();
+  // An absolute path contains a slash, so the linker opens this file and does not search for it.
+  if (dlopen(std::filesystem::absolute(file).c_str(), RTLD_NOW | RTLD_LOCAL) == nullptr) {
+    const char* message = dlerror();
+    refuseUnlinkable(message == nullptr ? "the dynamic linker gives no reason" : message);
+  }
+  checkNewRegistrations(lab, registered, refused);
+}
+
+void checkNewRegistrations(const QZLab& lab, std::size_t registered, std::size_t refused) {
+  if (lab.refusedNames().size() > refused) {
+    throw InputError("registers the name '" + lab.refusedNames()[refused] + "', which is already taken");
+  }
+  if (lab.registrations().size() == registered) throw InputError("registers nothing");
+}
+
+std::vector<LoadedPlugin> loadPlugins(const std::vector<std::filesystem::path>& files) {
+  std::vector<LoadedPlugin> loaded = loadEach(files, nullptr);
+  checkDiagnostics(QZLab::defaultLab(), loaded);
   return loaded;
 }
 
-void loadSomePlugins(const std::vector<std::filesystem::path>& files) { loadEach(files, nullptr); }
+void loadSomePlugins(const std::vector<std::filesystem::path>& files, const std::function<void()>& isNext) {
+  loadEach(files, isNext);
+}
+
+void checkDiagnostics(const QZLab& lab, const std::vector<LoadedPlugin>& plugins) {
+  const std::vector<QZLab::Registration>& registrations = lab.registrations();
+  std::size_t at = 0;
+  for (const LoadedPlugin& plugin : plugins) {
+    for (; at < plugin.last; ++at) {
+      const QZLab::Registration& one = registrations[at];
+      if (one.kind != QZLab::Kind::kDiagnostic) continue;
+      checkPart(lab, plugin, one.name, QZLab::Kind::kExperiment, one.experimentName);
+      checkPart(lab, plugin, one.name, QZLab::Kind::kAnalysis, one.analysisName);
+    }
+  }
+}
 
 std::optional<int> contractVersionIn(std::string_view linkerMessage) {
   // The mangled name of the contract's namespace: 6quazor, the length of the next name, contract_, the version.

@@ -96,6 +96,23 @@ std::vector<ResolvedParameter> parametersAt(const Json& json, const char* key) {
   return parameters;
 }
 
+std::string_view kindName(QZLab::Kind kind) {
+  switch (kind) {
+    case QZLab::Kind::kExperiment: return "experiment";
+    case QZLab::Kind::kAnalysis: return "analysis";
+    case QZLab::Kind::kDiagnostic: break;
+  }
+  return "diagnostic";
+}
+
+QZLab::Kind kindAt(const Json& json, const char* key) {
+  const std::string name = get<std::string>(json, key);
+  for (const QZLab::Kind kind : {QZLab::Kind::kExperiment, QZLab::Kind::kAnalysis, QZLab::Kind::kDiagnostic}) {
+    if (kindName(kind) == name) return kind;
+  }
+  throw InputError("unknown kind of registration '" + name + "'");
+}
+
 LogLevel levelAt(const Json& json, const char* key) {
   const std::string name = get<std::string>(json, key);
   for (const LogLevel level : {LogLevel::kError, LogLevel::kDefault, LogLevel::kDebug}) {
@@ -336,27 +353,22 @@ RunEvent eventFrom(const Json& json) {
   throw InputError("unknown event '" + name + "'");
 }
 
-Json diagnosticJson(const Diagnostic& diagnostic) {
-  return {{"name", losslessText(diagnostic.name)},
-          {"summary", losslessText(diagnostic.summary)},
-          {"experiment", losslessText(diagnostic.experimentName)},
-          {"analysis", losslessText(diagnostic.analysisName)},
-          {"experimentOnly", diagnostic.experimentOnly},
-          {"usedBy", textsJson(diagnostic.usedBy)},
-          {"plugins", textsJson({diagnostic.plugins.begin(), diagnostic.plugins.end()})}};
+Json registrationJson(const QZLab::Registration& registration) {
+  return {{"kind", kindName(registration.kind)},
+          {"name", losslessText(registration.name)},
+          {"summary", losslessText(registration.summary)},
+          {"experiment", losslessText(registration.experimentName)},
+          {"analysis", losslessText(registration.analysisName)}};
 }
 
-Diagnostic diagnosticFrom(const Json& json) {
-  const std::vector<std::string> plugins = textsAt(json, "plugins");
-  return {textAt(json, "name"),
+QZLab::Registration registrationFrom(const Json& json) {
+  return {kindAt(json, "kind"),
+          textAt(json, "name"),
           textAt(json, "summary"),
           textAt(json, "experiment"),
           textAt(json, "analysis"),
           nullptr,
-          nullptr,
-          get<bool>(json, "experimentOnly"),
-          textsAt(json, "usedBy"),
-          {plugins.begin(), plugins.end()}};
+          nullptr};
 }
 
 Json descriptionJson(const DiagnosticDescription& description) {

@@ -2,7 +2,9 @@
 // docs/record_format.md is the public description.
 #pragma once
 
+#include "contract/lab.h"
 #include "host/model/run_event.h"
+#include "host/plugin/diagnostic_registry.h"
 
 #include <nlohmann/json.hpp>
 
@@ -13,10 +15,9 @@ nlohmann::ordered_json eventJson(const RunEvent& event);
 // Throws InputError if the JSON is not an event.
 RunEvent eventFrom(const nlohmann::ordered_json& json);
 
-// The name, summary and parts of a diagnostic, and the diagnostics that use it.
-nlohmann::ordered_json diagnosticJson(const Diagnostic& diagnostic);
+nlohmann::ordered_json registrationJson(const QZLab::Registration& registration);
 // The result has no factories. Throws InputError.
-Diagnostic diagnosticFrom(const nlohmann::ordered_json& json);
+QZLab::Registration registrationFrom(const nlohmann::ordered_json& json);
 
 nlohmann::ordered_json descriptionJson(const DiagnosticDescription& description);
 // Throws InputError.

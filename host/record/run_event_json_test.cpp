@@ -215,19 +215,22 @@ TEST(EventFrom, RefusesAParameterWithAValueFromNowhere) {
   EXPECT_EQ(problemOf(json), "\"source\" is missing");
 }
 
-TEST(DiagnosticFrom, ReadsADiagnosticBackWithoutItsFactories) {
-  const Diagnostic diagnostic{"N\xff", "S", "E", "A", nullptr, nullptr, true, {"U", "V"}, {"a/p.so", "q\xff.so"}};
-  const Diagnostic read = diagnosticFrom(Json::parse(diagnosticJson(diagnostic).dump()));
-  EXPECT_EQ(read.name, diagnostic.name);
-  EXPECT_EQ(read.summary, "S");
-  EXPECT_EQ(read.experimentName, "E");
-  EXPECT_EQ(read.analysisName, "A");
-  EXPECT_EQ(read.makeExperiment, nullptr);
-  EXPECT_EQ(read.makeAnalysis, nullptr);
-  EXPECT_TRUE(read.experimentOnly);
-  EXPECT_EQ(read.usedBy, diagnostic.usedBy);
-  EXPECT_EQ(read.plugins, diagnostic.plugins);
-  EXPECT_THROW(diagnosticFrom(Json::parse(R"({"name":"N"})")), InputError);
+TEST(RegistrationFrom, ReadsARegistrationBackWithoutItsFactories) {
+  for (const QZLab::Kind kind : {QZLab::Kind::kExperiment, QZLab::Kind::kAnalysis, QZLab::Kind::kDiagnostic}) {
+    const QZLab::Registration registration{
+        kind, "N\xff", "S", "E", "A", [] { return nullptr; }, [] { return nullptr; }};
+    const QZLab::Registration read = registrationFrom(Json::parse(registrationJson(registration).dump()));
+    EXPECT_EQ(read.kind, kind);
+    EXPECT_EQ(read.name, registration.name);
+    EXPECT_EQ(read.summary, "S");
+    EXPECT_EQ(read.experimentName, "E");
+    EXPECT_EQ(read.analysisName, "A");
+    EXPECT_EQ(read.makeExperiment, nullptr);
+    EXPECT_EQ(read.makeAnalysis, nullptr);
+  }
+  EXPECT_THROW(registrationFrom(Json::parse(R"({"kind":"analysis","name":"N"})")), InputError);
+  EXPECT_THROW(registrationFrom(Json::parse(R"({"kind":"toy","name":"N","summary":"","experiment":"","analysis":""})")),
+               InputError);
 }
 
 TEST(DescriptionFrom, ReadsADescriptionBack) {

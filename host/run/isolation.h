@@ -1,4 +1,4 @@
-// Runs plug-ins in separate processes.
+// Runs diagnostics in separate processes.
 #pragma once
 
 #include "host/model/run_event.h"
@@ -12,9 +12,7 @@
 #include <cstdint>
 #include <filesystem>
 #include <functional>
-#include <memory>
 #include <optional>
-#include <string>
 #include <vector>
 
 namespace quazor {
@@ -25,35 +23,17 @@ struct IsolationOptions {
   std::vector<DeadlineSetting> deadlines;
 };
 
-// A plug-in that could not be loaded because loading it ended the process.
-struct FailedPlugin {
-  std::filesystem::path file;
-  DiagnosticErrorPtr error;
-};
+// Calls `body` in a separate process and passes on the events that it sends, from the first stage to
+// DiagnosticCompleted, which follows only when the process has ended by itself with exit code 0. Otherwise it is
+// missing, and a Failed event for the current or last stage gives the reason. After the last stage, the process has as
+// much time to end as that stage had. Standard output and standard error of the process become log lines. Returns false
+// if the user interrupted the run.
+bool superviseRun(const IsolationOptions& options, WatchedSignals& signals, const Diagnostic& diagnostic,
+                  const ResolvedParameters& parameters, const std::function<void(RunEventSink& toParent)>& body,
+                  Progress& progress, RunEventSink& events);
 
-// Returns the options without the failed plug-ins, which would end every process that loads them.
-IsolationOptions withoutFailed(IsolationOptions options, const std::vector<FailedPlugin>& failed);
-
-// The diagnostics of the plug-ins, without factories, and the plug-ins that could not be loaded.
-struct PluginScan {
-  std::vector<DescribedDiagnostic> catalogue;
-  std::vector<FailedPlugin> failed;
-  bool interrupted = false;
-};
-
-// Selects diagnostics from a registry.
-using DiagnosticChoice = std::function<std::vector<Diagnostic>(const std::vector<Diagnostic>& catalogue)>;
-
-// Loads the plug-ins in a separate process and lists their diagnostics. Only those selected by `described` are asked
-// for their descriptions. A plug-in that ends the process while it is loaded is listed in `failed`; if a description
-// ends the process, that is the error of the description. Throws the CommandErrors of loadPlugins and of `described`,
-// which is called in the separate process.
-PluginScan scanPlugins(const IsolationOptions& options, WatchedSignals& signals, const DiagnosticChoice& described);
-
-// Like runDiagnostic, but in a separate process, which loads only the plug-ins that the diagnostic needs, if they are
-// known. If the process ends early, a Failed event for the current stage gives the reason, and DiagnosticCompleted is
-// missing. Standard output and standard error of the process become log lines. Returns false if the user interrupted
-// the run.
+// Like runDiagnostic, but in a separate process, as superviseRun, which loads only the plug-ins that the diagnostic
+// needs, if they are known.
 //
 // If `result` is not null, it is analyzed instead of running an experiment.
 bool runIsolated(const IsolationOptions& options, WatchedSignals& signals, const Diagnostic& diagnostic,

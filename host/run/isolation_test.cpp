@@ -1,19 +1,19 @@
 #include "host/run/isolation.h"
 
-#include "host/error/exit_code.h"
 #include "host/error/host_error.h"
 #include "host/model/record_builder.h"
+#include "host/run/plugin_scan.h"
 #include "host/testing/plugins/fake_diagnostic.h"
+#include "host/testing/test_descriptors.h"
 #include "host/testing/test_environment.h"
 #include "host/testing/test_events.h"
 #include "host/testing/test_phone.h"
-#include "host/testing/test_refusals.h"
+#include "host/testing/test_plugins.h"
 #include "host/testing/test_signals.h"
 #include "host/testing/test_values.h"
 
 #include <gmock/gmock.h>
 #include <gtest/gtest.h>
-#include <sys/resource.h>
 #include <unistd.h>
 
 #include <algorithm>
@@ -25,6 +25,7 @@ namespace {
 using namespace std::chrono_literals;
 using fake::Behaviour;
 using testing::ElementsAre;
+using testing::EndsWith;
 using testing::HasSubstr;
 using testing::IsEmpty;
 
@@ -34,160 +35,17 @@ constexpr bool kHasSanitizer = true;
 constexpr bool kHasSanitizer = false;
 #endif
 
-std::filesystem::path plugin(const std::string& name) {
-  return std::filesystem::path(QUAZOR_TEST_PLUGINS) / (name + "_plugin.so");
-}
-
-std::vector<Diagnostic> everything(const std::vector<Diagnostic>& catalogue) { return catalogue; }
-
 class IsolationTest : public testing::Test {
  protected:
   PluginScan scan(const std::vector<std::string>& plugins) {
-    for (const std::string& name : plugins) options_.plugins.push_back(plugin(name));
-    return scanPlugins(options_, signals_, everything);
-  }
-
-  static std::vector<std::string> namesIn(const PluginScan& scan) {
-    std::vector<std::string> names;
-    for (const DescribedDiagnostic& one : scan.catalogue) names.push_back(one.diagnostic.name);
-    return names;
+    for (const std::string& name : plugins) options_.plugins.push_back(testPlugin(name));
+    return scanPlugins(options_, signals_, [](const std::vector<Diagnostic>& catalogue) { return catalogue; });
   }
 
   const DefaultRequestsToEnd defaults_;
   WatchedSignals signals_;
   IsolationOptions options_;
 };
-
-using ScanTest = IsolationTest;
-
-TEST_F(ScanTest, TellsWhatThePluginsHaveWithoutLoadingThemHere) {
-  const std::size_t before = QZLab::defaultLab().registrations().size();
-  const PluginScan all = scan({"working", "experiments"});
-  EXPECT_EQ(QZLab::defaultLab().registrations().size(), before);
-  EXPECT_THAT(all.failed, IsEmpty());
-  EXPECT_FALSE(all.interrupted);
-  EXPECT_THAT(namesIn(all), ElementsAre("Fake.One", "Fake.Two", "Broken.Nothing", "Broken.Factory",
-                                        "Broken.Description", "FakeExperiment", "NoExperiment", "ThrowingFactory",
-                                        "UndescribableExperiment", "Alone.Images", "Alone.Counts", "Alone.Nothing"));
-  const DescribedDiagnostic& one = all.catalogue[0];
-  EXPECT_EQ(one.diagnostic.summary, "Does as it is told.");
-  EXPECT_EQ(one.diagnostic.analysisName, "FakeAnalysis");
-  EXPECT_EQ(one.diagnostic.makeExperiment, nullptr);
-  EXPECT_EQ(one.description.error, nullptr);
-  EXPECT_TRUE(one.description.experiment.parameters().contains("duration"));
-  EXPECT_EQ(textOf(all.catalogue[3].description.error),
-            "QuazorHostErrorDomain 2 describing ThrowingFactory threw an exception: factory threw");
-  EXPECT_TRUE(all.catalogue[5].diagnostic.experimentOnly);
-  EXPECT_THAT(all.catalogue[5].diagnostic.usedBy, ElementsAre("Fake.One", "Fake.Two"));
-}
-
-TEST_F(ScanTest, AsksOnlyForTheDescriptionsThatAreWanted) {
-  options_.plugins = {plugin("working")};
-  const PluginScan some = scanPlugins(options_, signals_, [](const std::vector<Diagnostic>& catalogue) {
-    return std::vector<Diagnostic>{catalogue[1]};
-  });
-  EXPECT_EQ(some.catalogue.size(), 9U);
-  EXPECT_EQ(some.catalogue[0].description.experiment.summary(), "");
-  EXPECT_EQ(some.catalogue[1].description.experiment.summary(), "Measures what it is told to.");
-  EXPECT_EQ(some.catalogue[3].description.error, nullptr);
-  for (std::size_t i = 0; i < some.catalogue.size(); ++i) EXPECT_EQ(some.catalogue[i].description.isAsked, i == 1) << i;
-}
-
-TEST_F(ScanTest, ThrowsTheRefusalsOfTheChoice) {
-  options_.plugins = {plugin("working")};
-  const auto refuse = [](const std::vector<Diagnostic>&) -> std::vector<Diagnostic> {
-    throw CommandError(ExitCode::kUsage, "not that");
-  };
-  EXPECT_THROW(scanPlugins(options_, signals_, refuse), CommandError);
-}
-
-TEST_F(ScanTest, TellsWhichPluginsADiagnosticNeeds) {
-  const PluginScan all = scan({"working", "combining", "experiments"});
-  const auto pluginsOf = [&all](const std::string& name) {
-    for (const DescribedDiagnostic& one : all.catalogue) {
-      if (one.diagnostic.name == name) return one.diagnostic.plugins;
-    }
-    return std::vector<std::filesystem::path>();
-  };
-  EXPECT_THAT(pluginsOf("Fake.One"), ElementsAre(plugin("working")));
-  EXPECT_THAT(pluginsOf("FakeExperiment"), ElementsAre(plugin("working")));
-  EXPECT_THAT(pluginsOf("Combined"), ElementsAre(plugin("working"), plugin("combining")));
-  EXPECT_THAT(pluginsOf("Combining.Own"), ElementsAre(plugin("combining")));
-  EXPECT_THAT(pluginsOf("Alone.Images"), ElementsAre(plugin("experiments")));
-}
-
-TEST_F(ScanTest, ThrowsTheRefusalsOfTheLoader) {
-  EXPECT_EQ(refusalOf(ExitCode::kCannotRead,
-                      [&] {
-                        scan({"working", "empty"});
-                      }),
-            "the plug-in '" + plugin("empty").string() + "' registers nothing");
-}
-
-TEST_F(ScanTest, LeavesOutAPluginThatEndsItsProcessWhileItIsLoaded) {
-  const PluginScan rest = scan({"experiments", "fatal", "analysis"});
-  EXPECT_THAT(namesIn(rest), ElementsAre("Alone.Images", "Alone.Counts", "Alone.Nothing"));
-  ASSERT_EQ(rest.failed.size(), 1U);
-  EXPECT_EQ(rest.failed[0].file, plugin("fatal"));
-  EXPECT_EQ(textOf(rest.failed[0].error), "QuazorHostErrorDomain 6 loading the plug-in '" + plugin("fatal").string() +
-                                              "' crashed: its process was terminated by signal 6 (SIGABRT)");
-}
-
-TEST_F(ScanTest, IsEmptyWhenNoPluginCanBeLoaded) {
-  const PluginScan none = scan({"fatal"});
-  EXPECT_THAT(none.catalogue, IsEmpty());
-  EXPECT_EQ(none.failed.size(), 1U);
-}
-
-TEST_F(ScanTest, EndsALoadingThatTakesTooLong) {
-  options_.deadlines = {{Stage::kLoad, 50ms}};
-  const EnvironmentVariable way("FATAL_PLUGIN", "hang");
-  const PluginScan none = scan({"fatal"});
-  ASSERT_EQ(none.failed.size(), 1U);
-  EXPECT_THAT(textOf(none.failed[0].error),
-              testing::AllOf(testing::StartsWith("QuazorHostErrorDomain 8 loading the plug-in '"),
-                             testing::EndsWith("exceeded its deadline of 0.05 s")));
-}
-
-TEST_F(ScanTest, LeavesOutAPluginThatWritesToItsProcessConnection) {
-  constexpr const char* kDescribed =
-      R"(={"says":"described","description":{"experiment":{"summary":"","parameters":[]},)"
-      R"("analysis":{"summary":"","parameters":[]},"error":null,"isAsked":true}})";
-  constexpr const char* kLines[] = {
-      "=garbage", "=5", R"(={"says":5})", R"(={"says":"strange"})", R"(={"says":"catalogue","catalogue":[{}]})",
-      kDescribed,
-  };
-  options_.plugins = {plugin("fatal")};
-  for (const char* line : kLines) {
-    const EnvironmentVariable way("FATAL_PLUGIN", line);
-    const PluginScan none = scanPlugins(options_, signals_, everything);
-    ASSERT_EQ(none.failed.size(), 1U) << line;
-    EXPECT_THAT(textOf(none.failed[0].error),
-                testing::EndsWith("closed or overwrote its process's connection to quazor"))
-        << line;
-    EXPECT_THAT(none.catalogue, IsEmpty()) << line;
-  }
-}
-
-TEST_F(ScanTest, GoesOnBehindWhatEndsItsProcessWhileItIsDescribed) {
-  const PluginScan all = scan({"undescribable", "unruly"});
-  EXPECT_THAT(all.failed, IsEmpty());
-  ASSERT_THAT(namesIn(all), ElementsAre("Fatal", "Unruly", "FatalExperiment", "UnrulyExperiment"));
-  EXPECT_EQ(textOf(all.catalogue[0].description.error),
-            "QuazorHostErrorDomain 7 describing Fatal ended its own process with exit code 4");
-  EXPECT_EQ(all.catalogue[1].description.error, nullptr);
-  EXPECT_TRUE(all.catalogue[1].description.experiment.parameters().contains("way"));
-  EXPECT_THAT(textOf(all.catalogue[2].description.error),
-              HasSubstr("describing FatalExperiment ended its own process"));
-  EXPECT_EQ(all.catalogue[3].description.error, nullptr);
-}
-
-TEST_F(ScanTest, EndsWhenTheUserInterruptsIt) {
-  const EnvironmentVariable way("FATAL_PLUGIN", "hang");
-  ASSERT_EQ(::kill(::getpid(), SIGINT), 0);
-  const PluginScan none = scan({"fatal", "working"});
-  EXPECT_TRUE(none.interrupted);
-}
 
 class RunTest : public IsolationTest {
  protected:
@@ -198,7 +56,7 @@ class RunTest : public IsolationTest {
   // Runs in a separate process and returns the record of the events.
   DiagnosticRecord run(const std::string& pluginName, const std::string& name,
                        const std::vector<std::string>& texts = {}, const QZExperimentResult* result = nullptr) {
-    options_.plugins = {plugin(pluginName)};
+    options_.plugins = {testPlugin(pluginName)};
     std::vector<ParameterOverride> settings;
     for (const std::string& text : texts) settings.push_back(parseOverride(text));
     DescribedDiagnostic diagnostic;
@@ -244,21 +102,11 @@ class RunTest : public IsolationTest {
   bool isCompleted_ = false;
 };
 
-// The number that the next descriptor gets.
-rlim_t nextDescriptor() {
-  const int next = ::dup(STDIN_FILENO);
-  ::close(next);
-  return static_cast<rlim_t>(next);
-}
-
 TEST_F(RunTest, EndsInAnErrorWhereNoProcessCanBeMade) {
   const rlim_t next = nextDescriptor();
-  rlimit before{};
-  ASSERT_EQ(::getrlimit(RLIMIT_NOFILE, &before), 0);
-  const rlimit few{next + 3, before.rlim_max};  // enough for one pipe, not for two
-  ASSERT_EQ(::setrlimit(RLIMIT_NOFILE, &few), 0);
+  std::optional<FewDescriptors> few(std::in_place);
   const DiagnosticRecord record = run("working", "Fake.One", {"duration=2"});
-  ASSERT_EQ(::setrlimit(RLIMIT_NOFILE, &before), 0);
+  few.reset();
   EXPECT_TRUE(goesOn_);
   EXPECT_EQ(record.verdict, Verdict::kError);
   EXPECT_EQ(defaultText(record.error),
@@ -306,7 +154,7 @@ TEST_F(RunTest, LoadsOnlyThePluginsThatTheDiagnosticNeeds) {
   const PluginScan all = scan({"working", "combining"});
   const auto runNow = [&](const std::string& name, const std::vector<std::string>& plugins) {
     options_.plugins.clear();
-    for (const std::string& one : plugins) options_.plugins.push_back(plugin(one));
+    for (const std::string& one : plugins) options_.plugins.push_back(testPlugin(one));
     RecordBuilder builder;
     builder.onEvent(beginningOf(name));
     for (const DescribedDiagnostic& one : all.catalogue) {
@@ -328,7 +176,7 @@ TEST_F(RunTest, FailsWhenThePluginsNoLongerHaveTheDiagnostic) {
   EXPECT_EQ(textOf(run("working", "Fake.Three").error),
             "QuazorHostErrorDomain 3 the plug-ins no longer register Fake.Three");
   EXPECT_EQ(textOf(run("empty", "Fake.One").error),
-            "QuazorHostErrorDomain 3 the plug-in '" + plugin("empty").string() + "' registers nothing");
+            "QuazorHostErrorDomain 3 the plug-in '" + testPlugin("empty").string() + "' registers nothing");
   EXPECT_TRUE(isCompleted_);
   EXPECT_TRUE(goesOn_);
 }
@@ -375,9 +223,12 @@ TEST_F(RunTest, EndsAPluginThatWritesALineWithoutEndToTheConnection) {
   EXPECT_EQ(logOf(record)[0], "an error line");
 }
 
-TEST_F(RunTest, HasNoPassWhenThePluginSaysThatAllIsDone) {
+TEST_F(RunTest, BelievesNoPluginThatSendsAllTheEventsOfAPass) {
   const DiagnosticRecord record = runUnruly(10);
-  EXPECT_EQ(textOf(record.error), "QuazorHostErrorDomain 4 nothing was measured");
+  EXPECT_EQ(textOf(record.error),
+            "QuazorHostErrorDomain 9 the stage run of Unruly closed or overwrote its process's connection to quazor");
+  EXPECT_THAT(record.measuredResults, IsEmpty());
+  EXPECT_FALSE(isCompleted_);
 }
 
 TEST_F(RunTest, TakesWhatThePluginPrintsForLogLines) {
@@ -438,13 +289,156 @@ TEST_F(RunTest, ShowsTheFramesOfThePhoneInTheOtherProcess) {
   };
   runOptions_.makePhone = [] { return std::make_unique<SlowPhone>(); };
   Progress progress(&terminal_);
-  options_.plugins = {plugin("working")};
+  options_.plugins = {testPlugin("working")};
   Diagnostic diagnostic;
   diagnostic.name = "Fake.One";
   progress.start("Fake.One", {std::nullopt, 90});
   runIsolated(options_, signals_, diagnostic, {}, runOptions_, nullptr, progress, events_);
   progress.stop();
   EXPECT_THAT(terminal_.str(), HasSubstr(" s, 17 of 90 frames"));
+}
+
+// Runs that send events of their own.
+class SupervisedRunTest : public IsolationTest {
+ protected:
+  // Returns the error of the run of "One", or "" if it passes.
+  std::string supervised(const std::function<void(RunEventSink& events)>& body) {
+    Diagnostic diagnostic;
+    diagnostic.name = "One";
+    events_.events.clear();
+    goesOn_ = superviseRun(options_, signals_, diagnostic, {}, body, progress_, events_);
+    RecordBuilder builder;
+    builder.onEvent(beginningOf("One"));
+    for (const RunEvent& event : events_.events) builder.onEvent(event);
+    for (const RunEvent& event : builder.ending(momentAt(99))) builder.onEvent(event);
+    const DiagnosticRecord record = builder.takeRecord();
+    EXPECT_EQ(record.verdict == Verdict::kPass, record.error == nullptr);
+    errorStage_ = record.errorStage;
+    return textOf(record.error);
+  }
+
+  static void send(RunEventSink& events, Stage stage) {
+    events.onEvent(StageStarted{stage, momentAt(1)});
+    events.onEvent(StageEnded{stage, 1s, momentAt(2)});
+  }
+
+  // Sends the events of a run that passes.
+  static void pass(RunEventSink& events) {
+    for (const Stage stage : kStages) send(events, stage);
+    events.onEvent(ResultsReported{{resultOf(90)}});
+    events.onEvent(DiagnosticCompleted{});
+  }
+
+  Progress progress_{nullptr};
+  EventList events_;
+  std::optional<Stage> errorStage_;
+  bool goesOn_ = false;
+};
+
+TEST_F(SupervisedRunTest, PassesIfItsProcessEndsWell) {
+  EXPECT_EQ(supervised(pass), "");
+  EXPECT_TRUE(goesOn_);
+  EXPECT_THAT(namesOf(events_.events), EndsWith("found diagnosticCompleted"));
+}
+
+TEST_F(SupervisedRunTest, PassesOnlyIfItsProcessEndsWell) {
+  struct Row {
+    const char* name;
+    void (*end)();
+    const char* error;
+  };
+  constexpr Row kRows[] = {
+      {"a crash", [] { std::abort(); },
+       "QuazorHostErrorDomain 6 One, after its results, crashed: its process was terminated by signal 6 (SIGABRT)"},
+      {"an exit", [] { ::_exit(3); },
+       "QuazorHostErrorDomain 7 One, after its results, ended its own process with exit code 3"},
+      {"no end", [] { ::pause(); }, "QuazorHostErrorDomain 8 One, after its results, exceeded its deadline of 0.2 s"},
+      {"an event", [] { ::usleep(300'000); },
+       "QuazorHostErrorDomain 9 One, after its results, closed or overwrote its process's connection to quazor"},
+  };
+  for (const Row& row : kRows) {
+    options_.deadlines = {{Stage::kAnalyze, std::string_view(row.name) == "no end" ? 200ms : 1min}};
+    const std::string error = supervised([&row](RunEventSink& events) {
+      pass(events);
+      if (std::string_view(row.name) == "an event") events.onEvent(Logged{});
+      row.end();
+    });
+    EXPECT_EQ(error, row.error) << row.name;
+    EXPECT_EQ(errorStage_, Stage::kAnalyze) << row.name;
+    EXPECT_TRUE(goesOn_) << row.name;
+    EXPECT_THAT(namesOf(events_.events), EndsWith("found failed")) << row.name;
+  }
+}
+
+TEST_F(SupervisedRunTest, PassesThoughItIsInterruptedWhileItEnds) {
+  const auto body = [parent = ::getpid()](RunEventSink& events) {
+    pass(events);
+    ::kill(parent, SIGINT);
+    ::usleep(100'000);
+  };
+  EXPECT_EQ(supervised(body), "");
+  EXPECT_TRUE(goesOn_);
+  EXPECT_EQ(signals_.requestsToEnd(), 1);
+}
+
+TEST_F(SupervisedRunTest, IsInterruptedIfItDoesNotEndAfterItsResults) {
+  const auto body = [parent = ::getpid()](RunEventSink& events) {
+    pass(events);
+    ::kill(parent, SIGINT);
+    ::pause();
+  };
+  EXPECT_EQ(supervised(body), "QuazorHostErrorDomain 11 One, after its results, was interrupted");
+  EXPECT_FALSE(goesOn_);
+}
+
+TEST_F(SupervisedRunTest, EndsARunThatStartsStagesForEver) {
+  options_.deadlines = {{std::nullopt, 300ms}};
+  const auto endless = [](RunEventSink& events) {
+    for (;;) {
+      for (const Stage stage : kStages) send(events, stage);
+      ::usleep(1000);
+    }
+  };
+  EXPECT_THAT(supervised(endless), HasSubstr("closed or overwrote its process's connection to quazor"));
+  EXPECT_EQ(errorStage_, Stage::kAnalyze);
+  const auto repeating = [](RunEventSink& events) {
+    for (;;) {
+      events.onEvent(StageStarted{Stage::kLoad, momentAt(1)});
+      ::usleep(1000);
+    }
+  };
+  EXPECT_THAT(supervised(repeating), HasSubstr("closed or overwrote its process's connection to quazor"));
+  EXPECT_EQ(errorStage_, Stage::kLoad);
+}
+
+TEST_F(SupervisedRunTest, GivesTimeToResultsBetweenTwoStages) {
+  options_.deadlines = {{std::nullopt, 600ms}};
+  const auto slow = [](RunEventSink& events) {
+    for (const Stage stage : {Stage::kLoad, Stage::kDescribe, Stage::kSetup, Stage::kRun}) send(events, stage);
+    for (int i = 0; i < 4; ++i) {
+      ::usleep(200'000);
+      events.onEvent(AuxiliaryDataAdded{std::to_string(i), i});
+    }
+    send(events, Stage::kAnalyze);
+    for (int i = 0; i < 4; ++i) {
+      ::usleep(200'000);
+      events.onEvent(ResultsReported{{resultOf(90)}});
+    }
+    events.onEvent(DiagnosticCompleted{});
+  };
+  EXPECT_EQ(supervised(slow), "");
+}
+
+TEST_F(SupervisedRunTest, GivesNoTimeToLogLinesBetweenTwoStages) {
+  options_.deadlines = {{std::nullopt, 200ms}};
+  const auto chatty = [](RunEventSink& events) {
+    send(events, Stage::kLoad);
+    for (;;) {
+      events.onEvent(Logged{});
+      ::usleep(1000);
+    }
+  };
+  EXPECT_THAT(supervised(chatty), HasSubstr("exceeded its deadline of 0.2 s"));
 }
 
 }  // namespace

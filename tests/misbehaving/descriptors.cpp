@@ -31,6 +31,23 @@ void writeToAll(int first, std::string_view text) {
   for (int descriptor = first; descriptor < kMaxDescriptors; ++descriptor) writeAll(descriptor, text);
 }
 
+// All the events that would follow if the diagnostic passed.
+constexpr std::string_view kPass =
+    R"({"event":"stageEnded","stage":"run","nanoseconds":1,"date":"2026-11-21T01:08:00.000000000Z"}
+{"event":"stageBegan","stage":"analyze","date":"2026-11-21T01:08:00.000000000Z"}
+{"event":"stageEnded","stage":"analyze","nanoseconds":1,"date":"2026-11-21T01:08:00.000000000Z"}
+{"event":"found","results":[{"name":"Forged","measurement":[1.0,"events"]}]}
+{"event":"diagnosticCompleted"}
+)";
+
+void forgeStagesForEver() {
+  for (;;) {
+    writeToAll(kFirstAfterStreams,
+               "{\"event\":\"stageBegan\",\"stage\":\"run\",\"date\":\"2026-11-21T01:08:00.000000000Z\"}\n");
+    ::usleep(1000);
+  }
+}
+
 // Writes all bytes, with and without a line end.
 void writeGarbageToOutput() {
   std::string bytes;
@@ -59,6 +76,11 @@ void addDescriptors() {
   addDiagnostic("ForeignEventEverywhere", {.inRun = [] {
                   writeToAll(kFirstAfterStreams, "{\"event\":\"runEnded\",\"date\":\"2026-11-21T01:08:00.000000Z\"}\n");
                 }});
+  addDiagnostic("ForgedPass", {.inRun = [] {
+                  writeToAll(kFirstAfterStreams, kPass);
+                  ::_exit(0);
+                }});
+  addDiagnostic("ForgedStages", {.inRun = forgeStagesForEver});
   addDiagnostic("GarbageToOutput", {.inRun = writeGarbageToOutput});
   addDiagnostic("FloodOfLines", {.inRun = [] { floodOutput("as many lines as this are of no use to anybody\n"); }});
   addDiagnostic("FloodWithoutLines", {.inRun = [] { floodOutput("0123456789"); }});

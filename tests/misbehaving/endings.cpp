@@ -1,11 +1,15 @@
 // Diagnostics that end their process or never return.
 #include "tests/misbehaving/misbehaviour.h"
 
+#include "platform/concurrency.h"
+#include "platform/platform.h"
+
 #include <pthread.h>
 #include <signal.h>
 #include <sys/stat.h>
 #include <unistd.h>
 
+#include <chrono>
 #include <cstddef>
 #include <cstdlib>
 #include <exception>
@@ -69,6 +73,34 @@ void sleepWithoutSignals() {
 
 void stopItself() { ::raise(SIGSTOP); }
 
+// Acts when it is destroyed.
+class LateAct {
+ public:
+  explicit LateAct(void (*what)()) : what_(what) {}
+  LateAct(const LateAct&) = delete;
+  LateAct& operator=(const LateAct&) = delete;
+  ~LateAct() { what_(); }
+
+ private:
+  void (*const what_)();
+};
+
+// Calls `what` when the phone, which must have virtual time, is destroyed, after the results were sent.
+void actWithThePhone(void (*what)()) {
+  const auto act = std::make_shared<LateAct>(what);
+  const auto queue = installedPlatform().concurrency->makeSerialQueue("Late", QualityOfService::kDefault);
+  // The queue lives as long as the task, which the phone keeps.
+  queue->asyncAfter(std::chrono::hours(1), [act, queue] {});
+}
+
+// Leaves a task that is due in an hour, and one that never returns if the phone has real time.
+void leaveTasks() {
+  const std::shared_ptr<Concurrency>& concurrency = installedPlatform().concurrency;
+  const auto pending = concurrency->makeSerialQueue("Pending", QualityOfService::kDefault);
+  pending->asyncAfter(std::chrono::hours(1), [pending] {});
+  concurrency->makeSerialQueue("Sleeping", QualityOfService::kDefault)->async([] { sleepForEver(); });
+}
+
 }  // namespace
 
 void addEndings() {
@@ -77,6 +109,10 @@ void addEndings() {
   addDiagnostic("CrashInTeardown", {.inTeardown = crash});
   addDiagnostic("CrashInDestructor", {.inDestructor = crash});
   addDiagnostic("CrashInAnalysis", {.inAnalysis = crash});
+  addDiagnostic("CrashWithThePhone", {.inRun = [] { actWithThePhone(crash); }});
+  addDiagnostic("LeaveWithThePhone", {.inRun = [] { actWithThePhone([] { ::_exit(7); }); }});
+  addDiagnostic("HangWithThePhone", {.inRun = [] { actWithThePhone([] { sleepForEver(); }); }});
+  addDiagnostic("LeaveTasks", {.inRun = leaveTasks});
   addDiagnostic("HangInSetup", {.inSetup = sleepForEver});
   addDiagnostic("HangInRun", {.inRun = sleepForEver});
   addDiagnostic("BusyLoopInRun", {.inRun = spinForEver});

@@ -1,10 +1,13 @@
 // A plug-in for tests of the host: diagnostics that do not go by the rules, each in its own way.
 #include "contract/log_channel.h"
 #include "host/testing/plugins/fake_diagnostic.h"
+#include "platform/concurrency.h"
+#include "platform/platform.h"
 
 #include <signal.h>
 #include <unistd.h>
 
+#include <chrono>
 #include <cstdio>
 #include <cstdlib>
 #include <memory>
@@ -21,6 +24,32 @@ constexpr int kConnection = 250;
 
 void tell(std::string_view text) {
   if (::write(kConnection, text.data(), text.size()) < 0) ::_exit(99);
+}
+
+// All the events that would follow if the diagnostic passed.
+constexpr std::string_view kPass =
+    R"({"event":"stageEnded","stage":"run","nanoseconds":1,"date":"2026-11-21T01:08:00.000000000Z"}
+{"event":"stageBegan","stage":"analyze","date":"2026-11-21T01:08:00.000000000Z"}
+{"event":"stageEnded","stage":"analyze","nanoseconds":1,"date":"2026-11-21T01:08:00.000000000Z"}
+{"event":"found","results":[{"name":"R","measurement":[1.0,"frames"]}]}
+{"event":"diagnosticCompleted"}
+)";
+
+// Interrupts quazor when it is destroyed.
+class LateInterrupt {
+ public:
+  LateInterrupt() = default;
+  LateInterrupt(const LateInterrupt&) = delete;
+  LateInterrupt& operator=(const LateInterrupt&) = delete;
+  ~LateInterrupt() { ::kill(::getppid(), SIGINT); }
+};
+
+// Interrupts quazor when the phone, which must have virtual time, is destroyed, after the results were sent.
+void interruptWithThePhone() {
+  const auto late = std::make_shared<LateInterrupt>();
+  // The queue lives as long as the task, which the phone keeps.
+  const auto queue = installedPlatform().concurrency->makeSerialQueue("Late", QualityOfService::kDefault);
+  queue->asyncAfter(std::chrono::hours(1), [late, queue] {});
 }
 
 // Misbehaves according to the parameter "way".
@@ -40,13 +69,9 @@ void goWrong(int way) {
       for (int i = 0; i < 10'003; ++i) std::printf("%d\n", i);
       break;
     case 9: tell("{\"event\":\"failed\",\"error\":{\"domain\":\"D\",\"code\":1,\"userInfo\":[]}}\n"); break;
-    case 10: tell("{\"event\":\"diagnosticCompleted\"}\n"); break;
+    case 10: tell(kPass); ::_exit(0);
     case 11: static_cast<void>(std::vector<char>(std::size_t{4} << 30)); break;
-    case 12:
-      tell("{\"event\":\"diagnosticCompleted\"}\n");
-      ::usleep(50'000);
-      ::kill(::getppid(), SIGINT);
-      break;
+    case 12: interruptWithThePhone(); break;
     case 13:
       for (int i = 0; i < 300; ++i) {
         logError("again");

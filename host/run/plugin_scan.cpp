@@ -1,0 +1,355 @@
+#include "host/run/plugin_scan.h"
+
+#include "base/text/input_error.h"
+#include "contract/lab.h"
+#include "host/device/phone.h"
+#include "host/error/host_error.h"
+#include "host/plugin/plugin_loader.h"
+#include "host/plugin/shared_object.h"
+#include "host/record/lossless_json.h"
+#include "host/record/run_event_json.h"
+#include "host/run/child_connection.h"
+#include "host/system/supervision.h"
+
+#include <algorithm>
+#include <chrono>
+#include <cstddef>
+#include <optional>
+#include <string>
+#include <string_view>
+#include <system_error>
+#include <utility>
+
+namespace quazor {
+
+namespace {
+
+using Json = nlohmann::ordered_json;
+using Moment = Supervision::Moment;
+using SteadyClock = std::chrono::steady_clock;
+
+// One side of the messages between a process of the scan and quazor.
+struct Conversation {
+  std::function<void(const ConnectionWriter& connection)> speak;          // in the process
+  std::function<void(const std::string& what, const Json& said)> listen;  // throws InputError
+  std::function<Moment()> deadline;
+};
+
+// Throws std::system_error if the process cannot be created.
+Supervised converse(const IsolationOptions& options, WatchedSignals& signals, const Conversation& conversation) {
+  const std::string token = newConnectionToken();
+  const auto speak = [&](int descriptor) { conversation.speak(ConnectionWriter(descriptor, token)); };
+  ChildProcess child(signals, speak, options.memory, isCleanupProcess);
+  Supervision supervision;
+  supervision.takeLine = [&](std::string_view line) {
+    try {
+      const Json said = documentIn(line, token);
+      conversation.listen(textFrom(memberOf(said, "says")), said);
+      return true;
+    } catch (const Json::exception&) {
+    } catch (const InputError&) {
+    }
+    return false;
+  };
+  supervision.takeOutput = [](std::string_view /*line*/) {};  // there is no run log to write to
+  supervision.deadline = conversation.deadline;
+  supervision.isDone = [] { return false; };  // what it said counts if it ends well
+  return supervise(child, signals, supervision);
+}
+
+std::string loadingOf(const std::filesystem::path& file) { return "loading the plug-in '" + file.string() + "'"; }
+
+DiagnosticErrorPtr noProcess(const std::string& purpose, const std::system_error& problem) {
+  return hostError(HostErrorCode::kNoProcess,
+                   "the process for " + purpose + " could not be created: " + problem.what());
+}
+
+// A plug-in in a process of its own.
+class PluginLoading {
+ public:
+  PluginLoading(const IsolationOptions& options, const Deadlines& deadlines, std::filesystem::path file)
+      : options_(options), deadline_(deadlines.of(Stage::kLoad)), file_(std::move(file)) {}
+
+  // Returns the error if the plug-in cannot be loaded. Throws a CommandError (kCannotRead) if it is refused.
+  DiagnosticErrorPtr perform(WatchedSignals& signals) {
+    const Moment end = SteadyClock::now() + deadline_;
+    const Conversation conversation{
+        [this](const ConnectionWriter& connection) { speak(connection); },
+        [this](const std::string& what, const Json& said) { listen(what, said); },
+        [end] { return end; },
+    };
+    try {
+      const Supervised supervised = converse(options_, signals, conversation);
+      if (refusal_) refusePlugin(file_, *refusal_);
+      if (!registrations_ || !endedWell(supervised)) return errorOf(supervised, loadingOf(file_), deadline_);
+    } catch (const std::system_error& problem) {
+      return noProcess(loadingOf(file_), problem);
+    }
+    return nullptr;
+  }
+
+  // After a successful perform().
+  const std::vector<QZLab::Registration>& registrations() const { return *registrations_; }
+
+ private:
+  void speak(const ConnectionWriter& connection) const {
+    const std::size_t before = QZLab::defaultLab().registrations().size();
+    try {
+      loadPlugin(file_);
+    } catch (const InputError& problem) {
+      connection.say({{"says", "refused"}, {"text", losslessText(problem.what())}});
+      return;
+    }
+    const std::vector<QZLab::Registration>& all = QZLab::defaultLab().registrations();
+    Json registrations = Json::array();
+    for (std::size_t i = before; i < all.size(); ++i) registrations.push_back(registrationJson(all[i]));
+    connection.say({{"says", "registered"}, {"registrations", std::move(registrations)}});
+  }
+
+  void listen(const std::string& what, const Json& said) {
+    if (refusal_ || registrations_) throw InputError("the process says more than one thing");
+    if (what == "refused") {
+      refusal_ = textFrom(memberOf(said, "text"));
+    } else if (what == "registered") {
+      std::vector<QZLab::Registration> registrations;
+      for (const Json& one : memberOf(said, "registrations")) registrations.push_back(registrationFrom(one));
+      registrations_ = std::move(registrations);
+    } else {
+      throw InputError("the process says '" + what + "'");
+    }
+  }
+
+  const IsolationOptions& options_;
+  const std::chrono::nanoseconds deadline_;
+  const std::filesystem::path file_;
+  std::optional<std::string> refusal_;
+  std::optional<std::vector<QZLab::Registration>> registrations_;
+};
+
+// Adds the registrations of a plug-in to the lab, as loading it in this process would.
+void addRegistrations(const std::filesystem::path& file, const std::vector<QZLab::Registration>& registrations,
+                      QZLab& lab) {
+  const std::size_t registered = lab.registrations().size();
+  const std::size_t refused = lab.refusedNames().size();
+  for (const QZLab::Registration& one : registrations) {
+    switch (one.kind) {
+      case QZLab::Kind::kExperiment: lab.addExperimentWithName(one.name, nullptr); break;
+      case QZLab::Kind::kAnalysis: lab.addAnalysisWithName(one.name, nullptr); break;
+      case QZLab::Kind::kDiagnostic:
+        lab.addDiagnosticWithName(one.name, one.summary, one.experimentName, one.analysisName);
+        break;
+    }
+  }
+  try {
+    checkNewRegistrations(lab, registered, refused);
+  } catch (const InputError& problem) {
+    refusePlugin(file, problem.what());
+  }
+}
+
+// The files that register the diagnostic, its experiment and its analysis.
+std::vector<std::filesystem::path> pluginsOf(const Diagnostic& one, const QZLab& lab,
+                                             const std::vector<LoadedPlugin>& loaded) {
+  const auto isPart = [&one](const QZLab::Registration& registration) {
+    switch (registration.kind) {
+      case QZLab::Kind::kDiagnostic: return !one.experimentOnly && registration.name == one.name;
+      case QZLab::Kind::kExperiment: return registration.name == one.experimentName;
+      case QZLab::Kind::kAnalysis: break;
+    }
+    return !one.experimentOnly && registration.name == one.analysisName;
+  };
+  std::vector<std::filesystem::path> files;
+  auto first = lab.registrations().begin();
+  for (const LoadedPlugin& plugin : loaded) {
+    const auto last = lab.registrations().begin() + static_cast<std::ptrdiff_t>(plugin.last);
+    if (std::any_of(first, last, isPart)) files.push_back(plugin.file);
+    first = last;
+  }
+  return files;
+}
+
+// Descriptions in one process, until it ends.
+class Describing {
+ public:
+  // All of `diagnostics` need the same plug-ins.
+  Describing(const IsolationOptions& options, const Deadlines& deadlines, std::vector<DescribedDiagnostic*> diagnostics)
+      : options_(options),
+        deadlines_(deadlines),
+        diagnostics_(std::move(diagnostics)),
+        plugins_(diagnostics_.front()->diagnostic.plugins) {
+    beginStage(Stage::kLoad);
+  }
+
+  // Fills in the descriptions, or errors. Returns the diagnostics that still need a description.
+  std::vector<DescribedDiagnostic*> perform(WatchedSignals& signals) {
+    const Conversation conversation{
+        [this](const ConnectionWriter& connection) { speak(connection); },
+        [this](const std::string& what, const Json& said) { listen(what, said); },
+        [this] { return deadline_; },
+    };
+    try {
+      const Supervised end = converse(options_, signals, conversation);
+      if (refusal_) {
+        failAll(hostError(HostErrorCode::kNothingMade, *refusal_));
+      } else if (described_ < diagnostics_.size() || !endedWell(end)) {
+        blame(end);
+      }
+    } catch (const std::system_error& problem) {
+      for (DescribedDiagnostic* const one : diagnostics_) {
+        fail(*one, noProcess("describing " + one->diagnostic.name, problem));
+      }
+      described_ = diagnostics_.size();
+    }
+    return {diagnostics_.begin() + static_cast<std::ptrdiff_t>(described_), diagnostics_.end()};
+  }
+
+ private:
+  void speak(const ConnectionWriter& connection) const {
+    try {
+      loadSomePlugins(plugins_, [&connection] { connection.say({{"says", "loading"}}); });
+    } catch (const CommandError& problem) {
+      connection.say({{"says", "refused"}, {"text", losslessText(problem.what())}});
+      return;
+    }
+    for (const DescribedDiagnostic* const one : diagnostics_) {
+      connection.say({{"says", "describing"}});
+      connection.say({{"says", "described"}, {"description", descriptionJson(descriptionOf(one->diagnostic))}});
+    }
+  }
+
+  static DiagnosticDescription descriptionOf(const Diagnostic& wanted) {
+    if (const std::optional<Diagnostic> found = registeredDiagnostic(QZLab::defaultLab(), wanted)) {
+      return describeDiagnostic(*found);
+    }
+    DiagnosticDescription none;
+    none.error = hostError(HostErrorCode::kNothingMade, "the plug-ins no longer register " + wanted.name);
+    return none;
+  }
+
+  void listen(const std::string& what, const Json& said) {
+    if (what == "loading" && loading_ < plugins_.size() && stage_ == Stage::kLoad) {
+      ++loading_;
+      beginStage(Stage::kLoad);
+    } else if (what == "refused" && stage_ == Stage::kLoad && !refusal_) {
+      refusal_ = textFrom(memberOf(said, "text"));
+    } else if (what == "describing" && !isDescribing_ && described_ < diagnostics_.size() && !refusal_) {
+      isDescribing_ = true;
+      beginStage(Stage::kDescribe);
+    } else if (what == "described" && isDescribing_) {
+      diagnostics_[described_]->description = descriptionFrom(memberOf(said, "description"));
+      isDescribing_ = false;
+      ++described_;
+    } else {
+      throw InputError("the process says '" + what + "' out of order");
+    }
+  }
+
+  void beginStage(Stage stage) {
+    stage_ = stage;
+    deadline_ = SteadyClock::now() + deadlines_.of(stage);
+  }
+
+  // Attributes the end of the process to the plug-in that was being loaded, which all the diagnostics need, or to the
+  // diagnostic that was being described, or was described last.
+  void blame(const Supervised& end) {
+    const std::chrono::nanoseconds deadline = deadlines_.of(stage_);
+    if (stage_ == Stage::kLoad) {
+      failAll(errorOf(end, loadingOf(plugins_[std::max<std::size_t>(loading_, 1) - 1]), deadline));
+      return;
+    }
+    described_ = std::min(described_, diagnostics_.size() - 1);
+    const std::string during = "describing " + diagnostics_[described_]->diagnostic.name;
+    fail(*diagnostics_[described_++], errorOf(end, during, deadline));
+  }
+
+  void failAll(const DiagnosticErrorPtr& error) {
+    for (DescribedDiagnostic* const one : diagnostics_) fail(*one, error);
+    described_ = diagnostics_.size();
+  }
+
+  static void fail(DescribedDiagnostic& one, DiagnosticErrorPtr error) {
+    one.description = DiagnosticDescription();
+    one.description.error = std::move(error);
+  }
+
+  const IsolationOptions& options_;
+  const Deadlines& deadlines_;
+  const std::vector<DescribedDiagnostic*> diagnostics_;
+  const std::vector<std::filesystem::path>& plugins_;
+  std::optional<std::string> refusal_;
+  std::size_t loading_ = 0;    // the plug-ins whose loading has begun
+  std::size_t described_ = 0;  // the diagnostics with a description
+  bool isDescribing_ = false;
+  Stage stage_ = Stage::kLoad;
+  Moment deadline_;
+};
+
+void checkFile(const std::filesystem::path& file) {
+  try {
+    validateSharedObject(file);
+  } catch (const InputError& problem) {
+    refusePlugin(file, problem.what());
+  }
+}
+
+}  // namespace
+
+IsolationOptions withoutFailed(IsolationOptions options, const std::vector<FailedPlugin>& failed) {
+  for (const FailedPlugin& plugin : failed) std::erase(options.plugins, plugin.file);
+  return options;
+}
+
+PluginScan scanPlugins(const IsolationOptions& options, WatchedSignals& signals, const DiagnosticChoice& described) {
+  const Deadlines deadlines({}, options.deadlines);
+  const int requestsBefore = signals.requestsToEnd();
+  const std::vector<std::filesystem::path> files = distinctFiles(options.plugins);
+  for (const std::filesystem::path& file : files) checkFile(file);
+  PluginScan scan;
+  QZLab lab;
+  std::vector<LoadedPlugin> loaded;
+  for (const std::filesystem::path& file : files) {
+    PluginLoading loading(options, deadlines, file);
+    DiagnosticErrorPtr error = loading.perform(signals);
+    scan.interrupted = signals.requestsToEnd() > requestsBefore;
+    if (scan.interrupted) return scan;
+    if (error != nullptr) {
+      scan.failed.push_back({file, std::move(error)});
+      continue;
+    }
+    addRegistrations(file, loading.registrations(), lab);
+    loaded.push_back({file, lab.registrations().size()});
+  }
+  if (scan.failed.empty()) checkDiagnostics(lab, loaded);
+  std::vector<Diagnostic> catalogue = catalogueOf(lab);
+  for (Diagnostic& one : catalogue) one.plugins = pluginsOf(one, lab, loaded);
+  const std::vector<Diagnostic> wanted = described(catalogue);
+  DiagnosticDescription none;
+  none.isAsked = false;
+  for (Diagnostic& one : catalogue) scan.catalogue.push_back({std::move(one), none});
+  scan.interrupted = !describeIsolated(options, signals, wanted, scan.catalogue);
+  return scan;
+}
+
+bool describeIsolated(const IsolationOptions& options, WatchedSignals& signals, const std::vector<Diagnostic>& wanted,
+                      std::vector<DescribedDiagnostic>& catalogue) {
+  const Deadlines deadlines({}, options.deadlines);
+  const int requestsBefore = signals.requestsToEnd();
+  std::vector<DescribedDiagnostic*> left;
+  for (DescribedDiagnostic& one : catalogue) {
+    if (contains(wanted, one.diagnostic)) left.push_back(&one);
+  }
+  while (!left.empty()) {
+    const std::vector<std::filesystem::path>& needed = left.front()->diagnostic.plugins;
+    const auto others = std::stable_partition(left.begin(), left.end(), [&needed](const DescribedDiagnostic* one) {
+      return one->diagnostic.plugins == needed;
+    });
+    Describing describing(options, deadlines, {left.begin(), others});
+    std::vector<DescribedDiagnostic*> next = describing.perform(signals);
+    if (signals.requestsToEnd() > requestsBefore) return false;
+    next.insert(next.end(), others, left.end());
+    left = std::move(next);
+  }
+  return true;
+}
+
+}  // namespace quazor

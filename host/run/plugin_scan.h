@@ -1,0 +1,48 @@
+// Finds out what plug-ins register, in separate processes.
+#pragma once
+
+#include "contract/diagnostic_error.h"
+#include "host/plugin/diagnostic_registry.h"
+#include "host/run/isolation.h"
+#include "host/system/child_process.h"
+
+#include <filesystem>
+#include <functional>
+#include <vector>
+
+namespace quazor {
+
+// A plug-in that could not be loaded: loading it ended its process, or there was no process.
+struct FailedPlugin {
+  std::filesystem::path file;
+  DiagnosticErrorPtr error;
+};
+
+// Returns the options without the failed plug-ins.
+IsolationOptions withoutFailed(IsolationOptions options, const std::vector<FailedPlugin>& failed);
+
+// The diagnostics of the plug-ins, without factories, and the plug-ins that could not be loaded.
+struct PluginScan {
+  std::vector<DescribedDiagnostic> catalogue;
+  std::vector<FailedPlugin> failed;
+  bool interrupted = false;
+};
+
+// Selects diagnostics from a registry.
+using DiagnosticChoice = std::function<std::vector<Diagnostic>(const std::vector<Diagnostic>& catalogue)>;
+
+// Loads each plug-in in a process of its own, lists the diagnostics of all, and asks those selected by `described` for
+// their descriptions. What one plug-in does has no effect on another: one that cannot be loaded is listed in `failed`,
+// and a diagnostic that needs a part of it is left out.
+//
+// Throws the CommandErrors of `described`, and kCannotRead if a file is no plug-in of this contract, registers nothing
+// or a name that is already taken, or if a diagnostic names a part that no plug-in registers although all were loaded.
+PluginScan scanPlugins(const IsolationOptions& options, WatchedSignals& signals, const DiagnosticChoice& described);
+
+// Asks the diagnostics of the catalogue that `wanted` contains for their descriptions. Those that need the same
+// plug-ins share a process, which loads only these. If a description ends the process, that is the error of the
+// description, and the rest go on in a new process. Returns false if the user interrupted it.
+bool describeIsolated(const IsolationOptions& options, WatchedSignals& signals, const std::vector<Diagnostic>& wanted,
+                      std::vector<DescribedDiagnostic>& catalogue);
+
+}  // namespace quazor
