@@ -334,8 +334,8 @@ def outcome_of(case):
 
 
 @functools.lru_cache(maxsize=None)
-def usual_surroundings(memory, shell):
-    return surroundings(run([WELL_BEHAVED], ["well_behaved"], memory, shell))
+def usual_surroundings(options, shell):
+    return surroundings(run([WELL_BEHAVED], ["well_behaved"], options, shell))
 
 
 def surroundings(outcome):
@@ -457,7 +457,7 @@ class MisbehavingTest(unittest.TestCase):
         self.assertEqual([one for one in events if one["event"] == "failed"], [])
         self.assertEqual(events[-1]["verdict"], "pass")
         self.assertEqual([one["text"] for one in events if one["event"] == "log"], ["the well-behaved one runs"])
-        self.assertEqual(surroundings(outcome), usual_surroundings(memory_options(case), case.shell))
+        self.assertEqual(surroundings(outcome), usual_surroundings((*memory_options(case), *case.options), case.shell))
         self.assertEqual(outcome.events[-1]["event"], "runEnded")
 
 
