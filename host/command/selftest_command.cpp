@@ -132,6 +132,7 @@ class Selftest {
 
 ExitCode selftestCommand(const Options& options, const Installation& installation, Console& console) {
   const std::vector<SelftestRow> rows = Selftest(options, installation, console).perform();
+  if (rows.empty()) throw CommandError(ExitCode::kCannotRead, "nothing was tested: no phone has an expected outcome");
   std::ostringstream text;
   if (options.report.format == Format::kJson) {
     text << documentText(selftestDocument(rows, options.seeds));

@@ -1,6 +1,9 @@
 #include "host/command/selftest.h"
 
+#include "host/command/commands.h"
 #include "host/error/host_error.h"
+#include "host/testing/test_directory.h"
+#include "host/testing/test_plugins.h"
 #include "host/testing/test_records.h"
 
 #include <gmock/gmock.h>
@@ -125,6 +128,19 @@ TEST(Selftest, IsADocumentToo) {
   EXPECT_EQ(document["rows"][0]["faultsFired"][0], 3);
   EXPECT_EQ(selftestDocument({row("alarm", passes(), 2, 2, {})}, 3)["rows"][0]["outcome"], "false alarm");
   EXPECT_TRUE(selftestDocument({row("healthy", passes(), 3, 3, {})}, 3)["rows"][0]["difference"].is_null());
+}
+
+TEST(SelftestCommand, IsRefusedWhereNothingIsTested) {
+  const TestDirectory directory;
+  const Installation installation(directory.path() / "bin" / "quazor");
+  directory.write(std::filesystem::relative(installation.defaultProfile(), directory.path()),
+                  R"({"schema": 1, "diagnostics": {}})");
+  std::ostringstream out;
+  std::ostringstream err;
+  Console console{out, err};
+  EXPECT_EQ(runProgram({"selftest", "--plugin", testPlugin("working")}, installation, console), ExitCode::kCannotRead);
+  EXPECT_EQ(err.str(), "quazor: nothing was tested: no phone has an expected outcome\n");
+  EXPECT_EQ(out.str(), "");
 }
 
 }  // namespace

@@ -4,7 +4,6 @@
 
 #include "contract/lab.h"
 #include "host/model/run_event.h"
-#include "host/plugin/diagnostic_registry.h"
 
 #include <nlohmann/json.hpp>
 

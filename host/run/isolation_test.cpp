@@ -394,7 +394,7 @@ TEST_F(SupervisedRunTest, IsInterruptedIfItDoesNotEndAfterItsResults) {
 TEST_F(SupervisedRunTest, EndsARunThatStartsStagesForEver) {
   options_.deadlines = {{std::nullopt, 300ms}};
   const auto endless = [](RunEventSink& events) {
-    for (;;) {
+    for (int i = 0; i < 1000; ++i) {
       for (const Stage stage : kStages) send(events, stage);
       ::usleep(1000);
     }
@@ -402,7 +402,7 @@ TEST_F(SupervisedRunTest, EndsARunThatStartsStagesForEver) {
   EXPECT_THAT(supervised(endless), HasSubstr("closed or overwrote its process's connection to quazor"));
   EXPECT_EQ(errorStage_, Stage::kAnalyze);
   const auto repeating = [](RunEventSink& events) {
-    for (;;) {
+    for (int i = 0; i < 1000; ++i) {
       events.onEvent(StageStarted{Stage::kLoad, momentAt(1)});
       ::usleep(1000);
     }
@@ -433,7 +433,7 @@ TEST_F(SupervisedRunTest, GivesNoTimeToLogLinesBetweenTwoStages) {
   options_.deadlines = {{std::nullopt, 200ms}};
   const auto chatty = [](RunEventSink& events) {
     send(events, Stage::kLoad);
-    for (;;) {
+    for (int i = 0; i < 1000; ++i) {
       events.onEvent(Logged{});
       ::usleep(1000);
     }
