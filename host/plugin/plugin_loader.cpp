@@ -52,6 +52,7 @@ std::vector<LoadedPlugin> loadEach(const std::vector<std::filesystem::path>& fil
   // A plug-in may change the working directory.
   const std::vector<std::filesystem::path> distinct = distinctFiles(files);
   std::vector<std::filesystem::path> absolute;
+  absolute.reserve(distinct.size());
   for (const std::filesystem::path& file : distinct) absolute.push_back(std::filesystem::absolute(file));
   std::vector<LoadedPlugin> loaded;
   for (std::size_t i = 0; i < distinct.size(); ++i) {

@@ -3,6 +3,7 @@
 #include "base/text/input_error.h"
 #include "contract/lab.h"
 #include "host/device/phone.h"
+#include "host/error/exit_code.h"
 #include "host/error/host_error.h"
 #include "host/plugin/plugin_loader.h"
 #include "host/plugin/shared_object.h"
