@@ -12,6 +12,7 @@ from command_line_fixture import PLUGINS, WORKING, CommandLineTest, events_in, q
 
 FATAL = str(PLUGINS / "fatal_plugin.so")
 UNRULY = str(PLUGINS / "unruly_plugin.so")
+UNPRIVILEGED = 54321  # a user without processes
 
 
 class ParametersTest(CommandLineTest):
@@ -151,6 +152,22 @@ class ProcessTest(CommandLineTest):
         self.assertEqual((described.returncode, described.stderr), (66, text))
         ran = quazor("run", "--all", "--plugin", FATAL, "--phone", self.phone, "--profile", "none")
         self.assertEqual(ran.returncode, 2)
+
+    def test_a_plugin_that_gets_no_process_is_told(self):
+        def take_processes():
+            resource.setrlimit(resource.RLIMIT_NPROC, (1, 1))
+            if os.getuid() == 0:
+                os.setuid(UNPRIVILEGED)  # the limit does not apply to root
+
+        self.directory.chmod(0o777)
+        try:
+            ran = quazor("run", "--all", "--plugin", WORKING, "--phone", self.phone, "--profile", "none", "--format",
+                         "json", "--output", self.output, preexec_fn=take_processes)
+        except PermissionError:
+            self.skipTest("the program is in a directory that only root may read")
+        self.assertEqual(ran.returncode, 2, ran.stderr)
+        record, = json.loads(self.output.read_text())["diagnostics"]
+        self.assertEqual((record["name"], record["error"]["code"]), ("working_plugin.so", 12))
 
     def test_a_plugin_cannot_end_a_run_without_an_error(self):
         for line in ('{"says":"refused","code":0,"text":"nothing to do"}', '{"says":"registered","registrations":[]}',
