@@ -1,5 +1,6 @@
 #include "host/cli/command_line.h"
 
+#include "base/text/input_error.h"
 #include "base/text/nearest_name.h"
 #include "contract/contract.h"
 #include "host/device/phone.h"
@@ -54,6 +55,7 @@ struct RawOptions {
   std::vector<std::string> names;
   std::vector<std::string> plugins;
   std::vector<std::string> settings;
+  std::vector<std::string> limits;
   std::vector<std::string> parameterFiles;
   std::vector<std::string> records;
   std::vector<std::string> outputs;
@@ -98,8 +100,8 @@ void removeMarks(RawOptions& raw) {
   const auto removeMark = [](std::string& text) {
     if (text.starts_with(kMark)) text.erase(0, 1);
   };
-  for (std::vector<std::string>* texts :
-       {&raw.names, &raw.plugins, &raw.settings, &raw.parameterFiles, &raw.records, &raw.outputs, &raw.deadlines}) {
+  for (std::vector<std::string>* texts : {&raw.names, &raw.plugins, &raw.settings, &raw.limits, &raw.parameterFiles,
+                                          &raw.records, &raw.outputs, &raw.deadlines}) {
     std::for_each(texts->begin(), texts->end(), removeMark);
   }
   for (std::string* text : {&raw.profile, &raw.phone, &raw.record, &raw.of, &raw.seed, &raw.seeds, &raw.memory}) {
@@ -148,6 +150,13 @@ void addParameterOptions(CLI::App& command, RawOptions& raw) {
                 "QUAZOR_SET holds settings in the same form, separated by spaces. Precedence, highest first: --set, "
                 "QUAZOR_SET, --parameters, --profile",
                 "[experiment.|analysis.]NAME=VALUE");
+}
+
+void addLimits(CLI::App& command, RawOptions& raw) {
+  addRepeatable(command, "--limit", raw.limits,
+                "Also judge results by this limit, such as 'BackTele.Total >= 90', '*.FrameOffset in [-2, 2]' or "
+                "'A.Total == B.Total +- 1'; repeatable. It can only make a verdict stricter",
+                "[DIAGNOSTIC:]RESULT OP NUMBER [UNIT] [+- TOLERANCE]");
 }
 
 void addLogOptions(CLI::App& command, RawOptions& raw) {
@@ -208,6 +217,16 @@ std::optional<LogLevel> logLevelOf(const std::string& text) {
   if (text == "default") return LogLevel::kDefault;
   if (text == "debug") return LogLevel::kDebug;
   return std::nullopt;
+}
+
+UserLimit limitOfCommandLine(const std::string& text) {
+  try {
+    UserLimit limit = parseUserLimit(text);
+    limit.source = "command line";
+    return limit;
+  } catch (const InputError& problem) {
+    throw CommandError(ExitCode::kUsage, "--limit '" + text + "': " + problem.what());
+  }
 }
 
 // CLI11 accepts an empty option value; quazor does not.
@@ -296,6 +315,7 @@ Options optionsOf(const CLI::App& command, const RawOptions& raw) {
   options.seeds = parseWhole("--seeds", raw.seeds, 1, 1'000'000);
   options.memory = memoryOf(raw.memory);
   for (const std::string& text : raw.settings) options.settings.push_back(parseOverride(text));
+  for (const std::string& text : raw.limits) options.limits.push_back(limitOfCommandLine(text));
   for (const std::string& text : raw.deadlines) options.deadlines.push_back(parseDeadline(text));
   options.logLevel = logLevelOf(raw.logLevel);
   options.systemLog = raw.systemLog;
@@ -363,6 +383,8 @@ void declareRunningCommands(CLI::App& app, RawOptions& raw) {
     addParameterOptions(*command, raw);
     addProcessOptions(*command, raw);
   }
+  addLimits(run, raw);
+  addLimits(analyze, raw);
 }
 
 void declareOtherCommands(CLI::App& app, RawOptions& raw) {

@@ -123,7 +123,11 @@ Selection select(const Options& options, const Installation& installation) {
     }
   }
   if (!selected.empty()) checkOverrides(settings, selected);
-  Selection selection{{}, std::move(scan.failed)};
+  Selection selection{{}, std::move(scan.failed), {}};
+  for (const Profile& profile : profiles) {
+    selection.limits.insert(selection.limits.end(), profile.limits.begin(), profile.limits.end());
+  }
+  selection.limits.insert(selection.limits.end(), options.limits.begin(), options.limits.end());
   for (DescribedDiagnostic& one : selected) {
     ResolvedParameters parameters = resolveParameters(one, profiles, settings);
     selection.diagnostics.push_back({std::move(one), std::move(parameters)});

@@ -2,6 +2,7 @@
 
 #include "contract/message_format.h"
 #include "host/model/diagnostic_record.h"
+#include "host/model/limit_check.h"
 
 #include <cmath>
 #include <utility>
@@ -49,6 +50,14 @@ bool isInside(const QZLimit& limit, double value) {
     if (value > high || (value == high && upper->open())) return false;
   }
   return true;
+}
+
+// A limit of the user can only make the verdict stricter.
+void addTo(Judgement& judgement, const LimitCheck& check) {
+  if (check.passed || !check.counts() || judgement.problemCode) return;
+  judgement.verdict = Verdict::kFail;
+  if (check.problem.empty()) return;
+  judgement = {Verdict::kError, HostErrorCode::kCannotBeJudged, check.problem};
 }
 
 }  // namespace
@@ -107,7 +116,8 @@ RecordJudgement judgeRecord(const DiagnosticRecord& record, bool completed) {
     return {Verdict::kError, hostError(HostErrorCode::kConnectionLost, "the run was not completed")};
   }
   if (record.experimentOnly) return {Verdict::kPass, nullptr};
-  const Judgement judgement = judge(record.measuredResults);
+  Judgement judgement = judge(record.measuredResults);
+  for (const LimitCheck& check : limitChecksOf(record)) addTo(judgement, check);
   if (!judgement.problemCode) return {judgement.verdict, nullptr};
   return {Verdict::kError, hostError(*judgement.problemCode, judgement.problem)};
 }

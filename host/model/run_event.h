@@ -24,6 +24,7 @@ struct RunStarted {
   std::uint64_t seed = 0;
   bool ofExperiments = false;      // true for experiments on their own
   std::vector<std::string> names;  // of the diagnostics or experiments to run
+  std::vector<UserLimit> limits{};
 };
 
 struct DiagnosticStarted {

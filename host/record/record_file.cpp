@@ -90,9 +90,9 @@ RunEvent eventInLine(const std::filesystem::path& file, std::uint64_t sequence, 
     const Json json = parseJsonLine(line);
     if (sequence == 0) {
       const Json& format = memberOf(json, "record");
-      if (format != kRecordFormat) {
-        throw InputError("the record has format " + format.dump() + ", but this program reads format " +
-                         std::to_string(kRecordFormat));
+      if (!format.is_number_unsigned() || format < kFirstRecordFormat || format > kRecordFormat) {
+        throw InputError("the record has format " + format.dump() + ", but this program reads formats " +
+                         std::to_string(kFirstRecordFormat) + " to " + std::to_string(kRecordFormat));
       }
     }
     if (memberOf(json, "sequence") != sequence) {

@@ -96,6 +96,42 @@ std::vector<ResolvedParameter> parametersAt(const Json& json, const char* key) {
   return parameters;
 }
 
+Json limitsJson(const std::vector<UserLimit>& limits) {
+  Json json = Json::array();
+  for (const UserLimit& one : limits) {
+    Json limit = {{"limit", losslessText(canonicalText(one))},
+                  {"severity", nameOf(one.severity)},
+                  {"source", losslessText(one.source)},
+                  {"onlyIfSelected", one.onlyIfSelected}};
+    if (!one.name.empty()) limit["name"] = losslessText(one.name);
+    json.push_back(std::move(limit));
+  }
+  return json;
+}
+
+std::vector<UserLimit> limitsAt(const Json& json, const char* key) {
+  std::vector<UserLimit> limits;
+  if (!json.contains(key)) return limits;  // a record of format 1
+  for (const Json& one : arrayAt(json, key)) {
+    UserLimit limit;
+    try {
+      limit = parseUserLimit(textAt(one, "limit"));
+    } catch (const InputError& problem) {
+      throw InputError("the limit " + memberOf(one, "limit").dump(-1, ' ', true, Json::error_handler_t::replace) +
+                       " cannot be read: " + problem.what());
+    }
+    const std::string severity = get<std::string>(one, "severity");
+    const std::optional<LimitSeverity> known = limitSeverityNamed(severity);
+    if (!known) throw InputError("unknown severity '" + severity + "'");
+    limit.severity = *known;
+    limit.source = textAt(one, "source");
+    limit.onlyIfSelected = get<bool>(one, "onlyIfSelected");
+    if (one.contains("name")) limit.name = textAt(one, "name");
+    limits.push_back(std::move(limit));
+  }
+  return limits;
+}
+
 LogLevel levelAt(const Json& json, const char* key) {
   const std::string name = get<std::string>(json, key);
   for (const LogLevel level : {LogLevel::kError, LogLevel::kDefault, LogLevel::kDebug}) {
@@ -127,13 +163,14 @@ Json jsonOf(const RunStarted& event) {
           {"phone", losslessText(event.phone)},
           {"seed", event.seed},
           {"ofExperiments", event.ofExperiments},
-          {"names", textsJson(event.names)}};
+          {"names", textsJson(event.names)},
+          {"limits", limitsJson(event.limits)}};
 }
 
 RunEvent readRunBegan(const Json& json) {
   return RunStarted{textAt(json, "program"),          get<int>(json, "contract"), dateAt(json, "date"),
                     textsAt(json, "plugins"),         textAt(json, "phone"),      get<std::uint64_t>(json, "seed"),
-                    get<bool>(json, "ofExperiments"), textsAt(json, "names")};
+                    get<bool>(json, "ofExperiments"), textsAt(json, "names"),     limitsAt(json, "limits")};
 }
 
 Json jsonOf(const DiagnosticStarted& event) {

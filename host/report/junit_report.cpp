@@ -3,9 +3,11 @@
 #include "contract/message_format.h"
 #include "host/error/host_error.h"
 #include "host/model/incomplete_run.h"
+#include "host/model/limit_check.h"
 #include "host/report/junit_suite.h"
 #include "host/report/text_report.h"
 
+#include <cstddef>
 #include <string_view>
 
 namespace quazor {
@@ -58,6 +60,29 @@ void addResult(JUnitSuite& suite, const JudgedResult& judged) {
       formatMessage("%@ is %@, limit %@", result.name(), valueText(result.measurement()), limitText(result.limit())));
 }
 
+// A failed limit that only warns is a passed case with the verdict "warn".
+void addCheck(JUnitSuite& suite, const LimitCheck& check) {
+  const Measurement& measurement = check.result.measurement();
+  const std::string name = check.result.name() + ": " + labelOf(check.limit);
+  JUnitProperties properties;
+  properties.add("verdict", std::string(check.verdictName()));
+  properties.add("value", defaultText(measurement.value()));
+  properties.add("unit", measurement.unit().symbol());
+  properties.add("limit", labelOf(check.limit));
+  if (const std::optional<QZLimit> bounds = boundsOf(check)) {
+    addBound(properties, "lower", bounds->lowerBound());
+    addBound(properties, "upper", bounds->upperBound());
+  }
+  if (!check.problem.empty()) properties.add("problem", check.problem);
+  if (check.passed || !check.counts()) return suite.addPass(name, properties);
+  if (!check.problem.empty()) {
+    return suite.addError(name, properties, hostError(HostErrorCode::kCannotBeJudged, check.problem));
+  }
+  suite.addFailure(
+      name, properties,
+      formatMessage("%@ is %@, limit %@", check.result.name(), valueText(measurement), labelOf(check.limit)));
+}
+
 // Adds the measurements of an experiment on its own.
 void addExperiment(JUnitSuite& suite, const DiagnosticRecord& record) {
   JUnitProperties properties;
@@ -83,7 +108,11 @@ JUnitSuite suiteOf(const RunStarted& run, const DiagnosticRecord& record) {
   addParameters(properties, "experiment", record.parameters.experiment);
   addParameters(properties, "analysis", record.parameters.analysis);
   addRun(properties, run);
-  for (const JudgedResult& one : record.measuredResults) addResult(suite, one);
+  const std::vector<LimitCheck> checks = limitChecksOf(record);
+  for (std::size_t i = 0; i < record.measuredResults.size(); ++i) {
+    addResult(suite, record.measuredResults[i]);
+    for (const LimitCheck& check : checksOfResult(checks, i)) addCheck(suite, check);
+  }
   if (record.experimentOnly && record.verdict != Verdict::kError) addExperiment(suite, record);
   if (record.error != nullptr) {
     suite.addError(record.errorStage ? std::string(nameOf(*record.errorStage)) : "judge", {}, record.error);
