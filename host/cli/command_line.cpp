@@ -141,8 +141,11 @@ void addProcessOptions(CLI::App& command, RawOptions& raw) {
 
 void addParameterOptions(CLI::App& command, RawOptions& raw) {
   command
-      .add_option("--profile", raw.profile, "Read parameter values from this file; 'none' skips the default profile")
-      ->type_name("FILE");
+      .add_option(
+          "--profile", raw.profile,
+          "Read parameter values and limits from this file or installed profile, for example strict; 'none' skips "
+          "the default profile")
+      ->type_name("FILE|NAME");
   addRepeatable(command, "--parameters", raw.parameterFiles,
                 "Read more parameter values from this file, which has the format of a profile; repeatable", "FILE");
   addRepeatable(command, "--set", raw.settings,

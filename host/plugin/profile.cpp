@@ -57,7 +57,7 @@ UserLimit limitOf(const JsonCursor& entry, const std::string& diagnostic, const 
     constexpr std::string_view kNames[] = {"fail", "warn"};
     limit.severity = *limitSeverityNamed(severity->oneOf(kNames, "a severity"));
   }
-  limit.source = file.string();
+  limit.source = "profile " + file.filename().string();
   limit.onlyIfSelected = true;
   return limit;
 }

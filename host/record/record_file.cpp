@@ -87,13 +87,14 @@ bool readLine(std::istream& stream, std::string& line) {
 
 RunEvent eventInLine(const std::filesystem::path& file, std::uint64_t sequence, const std::string& line) {
   try {
-    const Json json = parseJsonLine(line);
+    Json json = parseJsonLine(line);
     if (sequence == 0) {
       const Json& format = memberOf(json, "record");
       if (!format.is_number_unsigned() || format < kFirstRecordFormat || format > kRecordFormat) {
         throw InputError("the record has format " + format.dump() + ", but this program reads formats " +
                          std::to_string(kFirstRecordFormat) + " to " + std::to_string(kRecordFormat));
       }
+      if (format == kFirstRecordFormat) json["limits"] = Json::array();  // added by format 2
     }
     if (memberOf(json, "sequence") != sequence) {
       throw InputError("the sequence number is " + memberOf(json, "sequence").dump() + " instead of " +

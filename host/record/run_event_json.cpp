@@ -111,7 +111,6 @@ Json limitsJson(const std::vector<UserLimit>& limits) {
 
 std::vector<UserLimit> limitsAt(const Json& json, const char* key) {
   std::vector<UserLimit> limits;
-  if (!json.contains(key)) return limits;  // a record of format 1
   for (const Json& one : arrayAt(json, key)) {
     UserLimit limit;
     try {
