@@ -51,8 +51,9 @@ struct RecordJudgement {
   DiagnosticErrorPtr error;  // set exactly when the verdict is kError: the record's own, or the judge's
 };
 
-// kError if the run had an error, the plug-in's part was not completed, or the results cannot be judged or compared with
-// the user's limits; otherwise what the results and these limits say. An experiment that runs alone is kPass if it was completed without an error: it is not judged.
+// kError if the run had an error, the plug-in's part was not completed, or the results cannot be judged or compared
+// with the user's limits; otherwise what the results and these limits say. An experiment that runs alone is kPass if it
+// was completed without an error: it is not judged.
 //
 // The verdict that the record holds does not count.
 RecordJudgement judgeRecord(const DiagnosticRecord& record, bool completed);
