@@ -1,8 +1,8 @@
 #include "host/cli/command_line.h"
 
-#include "base/text/input_error.h"
 #include "base/text/nearest_name.h"
 #include "contract/contract.h"
+#include "host/cli/option_values.h"
 #include "host/device/phone.h"
 #include "host/text/table.h"
 
@@ -56,6 +56,7 @@ struct RawOptions {
   std::vector<std::string> plugins;
   std::vector<std::string> settings;
   std::vector<std::string> limits;
+  std::vector<std::string> tags;
   std::vector<std::string> parameterFiles;
   std::vector<std::string> records;
   std::vector<std::string> outputs;
@@ -100,8 +101,8 @@ void removeMarks(RawOptions& raw) {
   const auto removeMark = [](std::string& text) {
     if (text.starts_with(kMark)) text.erase(0, 1);
   };
-  for (std::vector<std::string>* texts : {&raw.names, &raw.plugins, &raw.settings, &raw.limits, &raw.parameterFiles,
-                                          &raw.records, &raw.outputs, &raw.deadlines}) {
+  for (std::vector<std::string>* texts : {&raw.names, &raw.plugins, &raw.settings, &raw.limits, &raw.tags,
+                                          &raw.parameterFiles, &raw.records, &raw.outputs, &raw.deadlines}) {
     std::for_each(texts->begin(), texts->end(), removeMark);
   }
   for (std::string* text : {&raw.profile, &raw.phone, &raw.record, &raw.of, &raw.seed, &raw.seeds, &raw.memory}) {
@@ -153,6 +154,14 @@ void addParameterOptions(CLI::App& command, RawOptions& raw) {
                 "QUAZOR_SET holds settings in the same form, separated by spaces. Precedence, highest first: --set, "
                 "QUAZOR_SET, --parameters, --profile",
                 "[experiment.|analysis.]NAME=VALUE");
+}
+
+void addTags(CLI::App& command, RawOptions& raw) {
+  addRepeatable(
+      command, "--tag", raw.tags,
+      "Keep this in the record and the reports, for example serial=C02X; repeatable. The environment variable "
+      "QUAZOR_TAGS holds tags in the same form, separated by spaces",
+      "KEY=VALUE");
 }
 
 void addLimits(CLI::App& command, RawOptions& raw) {
@@ -220,16 +229,6 @@ std::optional<LogLevel> logLevelOf(const std::string& text) {
   if (text == "default") return LogLevel::kDefault;
   if (text == "debug") return LogLevel::kDebug;
   return std::nullopt;
-}
-
-UserLimit limitOfCommandLine(const std::string& text) {
-  try {
-    UserLimit limit = parseUserLimit(text);
-    limit.source = "command line";
-    return limit;
-  } catch (const InputError& problem) {
-    throw CommandError(ExitCode::kUsage, "--limit '" + text + "': " + problem.what());
-  }
 }
 
 // CLI11 accepts an empty option value; quazor does not.
@@ -322,6 +321,7 @@ Options optionsOf(const CLI::App& command, const RawOptions& raw) {
   for (const std::string& text : raw.deadlines) options.deadlines.push_back(parseDeadline(text));
   options.logLevel = logLevelOf(raw.logLevel);
   options.systemLog = raw.systemLog;
+  if (command.get_option_no_throw("--tag") != nullptr) options.tags = tagsOf(raw.tags);
   const bool isOfRun = options.command == Command::kRun || options.command == Command::kExperiment ||
                        options.command == Command::kAnalyze;
   options.report = reportOf(raw, isOfRun);
@@ -385,6 +385,7 @@ void declareRunningCommands(CLI::App& app, RawOptions& raw) {
     addReportOptions(*command, raw, formats);
     addParameterOptions(*command, raw);
     addProcessOptions(*command, raw);
+    addTags(*command, raw);
   }
   addLimits(run, raw);
   addLimits(analyze, raw);

@@ -45,6 +45,7 @@ struct Options {
   std::vector<std::filesystem::path> plugins;  // empty: the installed one
   std::vector<ParameterOverride> settings;
   std::vector<UserLimit> limits;
+  OrderedMap<std::string> tags;
   std::vector<std::filesystem::path> parameterFiles;
   std::vector<std::filesystem::path> records;  // to read
   std::filesystem::path record;                // to write; empty: none

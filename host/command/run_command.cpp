@@ -9,6 +9,7 @@
 #include "host/model/limit_check.h"
 #include "host/run/event_pipeline.h"
 #include "host/run/isolation.h"
+#include "host/system/identity.h"
 #include "host/system/interrupt_watcher.h"
 #include "host/text/table.h"
 #include "host/text/timestamp.h"
@@ -100,6 +101,9 @@ RunStarted beginningOf(const Options& options, const Installation& installation,
                        const std::vector<FailedPlugin>& failed) {
   RunStarted began{QUAZOR_VERSION, QUAZOR_CONTRACT_VERSION, dateNow(), {}, {}, options.seed, false, {}};
   for (const auto& file : isolationOf(options, installation).plugins) began.plugins.push_back(file.string());
+  began.id = randomIdentifier();
+  began.host = nameOfThisMachine();
+  began.tags = options.tags;
   began.ofExperiments = options.command == Command::kExperiment;
   for (const FailedPlugin& plugin : failed) began.names.push_back(plugin.file.filename().string());
   for (const Job& job : jobs) began.names.push_back(job.bound.described.diagnostic.name);

@@ -85,6 +85,13 @@ bool readLine(std::istream& stream, std::string& line) {
   return true;
 }
 
+void addWhatFormat1Lacks(Json& json) {
+  json["limits"] = Json::array();
+  json["id"] = "";
+  json["host"] = "";
+  json["tags"] = Json::array();
+}
+
 RunEvent eventInLine(const std::filesystem::path& file, std::uint64_t sequence, const std::string& line) {
   try {
     Json json = parseJsonLine(line);
@@ -94,7 +101,7 @@ RunEvent eventInLine(const std::filesystem::path& file, std::uint64_t sequence, 
         throw InputError("the record has format " + format.dump() + ", but this program reads formats " +
                          std::to_string(kFirstRecordFormat) + " to " + std::to_string(kRecordFormat));
       }
-      if (format == kFirstRecordFormat) json["limits"] = Json::array();  // added by format 2
+      if (format == kFirstRecordFormat) addWhatFormat1Lacks(json);
     }
     if (memberOf(json, "sequence") != sequence) {
       throw InputError("the sequence number is " + memberOf(json, "sequence").dump() + " instead of " +

@@ -131,6 +131,21 @@ std::vector<UserLimit> limitsAt(const Json& json, const char* key) {
   return limits;
 }
 
+Json tagsJson(const OrderedMap<std::string>& tags) {
+  Json json = Json::array();
+  for (const auto& [key, value] : tags) json.push_back(Json::array({losslessText(key), losslessText(value)}));
+  return json;
+}
+
+OrderedMap<std::string> tagsAt(const Json& json, const char* key) {
+  OrderedMap<std::string> tags;
+  for (const Json& one : arrayAt(json, key)) {
+    if (!one.is_array() || one.size() != 2) throw InputError("expected a tag: a key and a value");
+    tags.set(textFrom(one[0]), textFrom(one[1]));
+  }
+  return tags;
+}
+
 LogLevel levelAt(const Json& json, const char* key) {
   const std::string name = get<std::string>(json, key);
   for (const LogLevel level : {LogLevel::kError, LogLevel::kDefault, LogLevel::kDebug}) {
@@ -163,13 +178,25 @@ Json jsonOf(const RunStarted& event) {
           {"seed", event.seed},
           {"ofExperiments", event.ofExperiments},
           {"names", textsJson(event.names)},
-          {"limits", limitsJson(event.limits)}};
+          {"limits", limitsJson(event.limits)},
+          {"id", losslessText(event.id)},
+          {"host", losslessText(event.host)},
+          {"tags", tagsJson(event.tags)}};
 }
 
 RunEvent readRunBegan(const Json& json) {
-  return RunStarted{textAt(json, "program"),          get<int>(json, "contract"), dateAt(json, "date"),
-                    textsAt(json, "plugins"),         textAt(json, "phone"),      get<std::uint64_t>(json, "seed"),
-                    get<bool>(json, "ofExperiments"), textsAt(json, "names"),     limitsAt(json, "limits")};
+  return RunStarted{textAt(json, "program"),
+                    get<int>(json, "contract"),
+                    dateAt(json, "date"),
+                    textsAt(json, "plugins"),
+                    textAt(json, "phone"),
+                    get<std::uint64_t>(json, "seed"),
+                    get<bool>(json, "ofExperiments"),
+                    textsAt(json, "names"),
+                    limitsAt(json, "limits"),
+                    textAt(json, "id"),
+                    textAt(json, "host"),
+                    tagsAt(json, "tags")};
 }
 
 Json jsonOf(const DiagnosticStarted& event) {

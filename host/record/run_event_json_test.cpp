@@ -37,6 +37,9 @@ std::vector<EventRow> rows() {
   DiagnosticStarted diagnostic = beginningOf("Good");
   diagnostic.experimentOnly = true;
   const DiagnosticErrorPtr error = errorWithMessage("D", -2, "m", nullptr);
+  run.id = "0af3";
+  run.host = "bench 7";
+  run.tags = {{"serial", "C02X"}, {"station", "B\xff"}};
   RunStarted limited;
   limited.limits = {parseUserLimit("D*:R >= 2 V"), parseUserLimit("R == \"2\" +- 0.5")};
   limited.limits[0].name = "enough";
@@ -47,7 +50,8 @@ std::vector<EventRow> rows() {
   return {
       {run, R"({"event":"runBegan","program":"0.1.0","contract":2,"date":"2026-11-21T01:08:00.000000000Z",)"
             R"("plugins":["p.so"],"phone":"phone.json","seed":18446744073709551615,"ofExperiments":true,)"
-            R"("names":["Good",{"hex":"42ff"}],"limits":[]})"},
+            R"("names":["Good",{"hex":"42ff"}],"limits":[],"id":"0af3","host":"bench 7",)"
+            R"("tags":[["serial","C02X"],["station",{"hex":"42ff"}]]})"},
       {diagnostic,
        R"({"event":"diagnosticBegan","name":"Good","summary":"Its summary.","experiment":"E","analysis":"A",)"
        R"("experimentOnly":true,"parameters":{"experiment":[{"name":"duration","summary":"How long.",)"
@@ -79,7 +83,7 @@ std::vector<EventRow> rows() {
                 R"("limits":[{"limit":"D*:R >= 2 V","severity":"warn","source":"profile p.json",)"
                 R"("onlyIfSelected":true,"name":"enough"},)"
                 R"({"limit":"R == \"2\" +- 0.5","severity":"fail","source":"command line",)"
-                R"("onlyIfSelected":false}]})"},
+                R"("onlyIfSelected":false}],"id":"","host":"","tags":[]})"},
   };
 }
 
@@ -99,6 +103,14 @@ TEST(EventFrom, ReadsEveryEventBack) {
 TEST(EventFrom, ReadsLimitsBack) {
   const RunEvent limited = rows().back().event;
   EXPECT_EQ(std::get<RunStarted>(back(limited)).limits, std::get<RunStarted>(limited).limits);
+}
+
+TEST(EventFrom, ReadsTheIdentityOfARunBack) {
+  const RunEvent run = rows().front().event;
+  const auto read = std::get<RunStarted>(back(run));
+  EXPECT_EQ(read.id, "0af3");
+  EXPECT_EQ(read.host, "bench 7");
+  EXPECT_EQ(read.tags, std::get<RunStarted>(run).tags);
 }
 
 TEST(EventFrom, RefusesALimitThatCannotBeRead) {
@@ -193,7 +205,7 @@ TEST(EventFrom, RefusesAnEventWithoutOneOfItsMembers) {
       ++removed;
     }
   }
-  EXPECT_EQ(removed, 60);
+  EXPECT_EQ(removed, 66);
 }
 
 TEST(EventFrom, RefusesMembersOfAnotherKind) {

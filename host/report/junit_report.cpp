@@ -97,6 +97,9 @@ void addRun(JUnitProperties& properties, const RunStarted& run) {
   properties.add("contract", std::to_string(run.contract));
   for (const std::string& plugin : run.plugins) properties.add("plugin", plugin);
   properties.add("phone", run.phone);
+  if (!run.id.empty()) properties.add("run", run.id);
+  if (!run.host.empty()) properties.add("host", run.host);
+  for (const auto& [key, value] : run.tags) properties.add("tag." + key, value);
 }
 
 JUnitSuite suiteOf(const RunStarted& run, const DiagnosticRecord& record) {

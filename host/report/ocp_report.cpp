@@ -6,6 +6,7 @@
 #include "host/model/limit_check.h"
 #include "host/record/value_json.h"
 #include "host/report/ocp_stream.h"
+#include "host/report/run_identity.h"
 #include "host/report/text_report.h"
 
 #include <algorithm>
@@ -80,9 +81,15 @@ Json startJson(const RunStarted& run, const std::string& name, std::string comma
                const ResolvedParameters& parameters = {}, Json metadata = Json::object()) {
   Json dut = {{"dutInfoId", "phone"}};
   addText(dut, "name", run.phone);
+  if (const std::string serial = serialNumberOf(run); !serial.empty()) {
+    dut["hardwareInfos"] = {{{"hardwareInfoId", "phone"}, {"name", "phone"}, {"serialNumber", serial}}};
+  }
   metadata["seed"] = run.seed;
   metadata["contract"] = run.contract;
   metadata["plugins"] = run.plugins;
+  addText(metadata, "run", run.id);
+  addText(metadata, "host", run.host);
+  for (const auto& [key, value] : run.tags) metadata["tags"][key] = value;
   return {{"name", name},
           {"version", run.program},
           {"commandLine", std::move(commandLine)},
