@@ -1,6 +1,5 @@
 """Records: written, verified, analyzed again, compared, and used for another run."""
 
-import socket
 import json
 import pathlib
 import random
@@ -42,18 +41,6 @@ class MakingTest(RecordTest):
         self.assertEqual(events[-1]["event"], "runEnded")
         self.assertNotIn("interrupted", events[-1])
         self.assert_verifies(self.record)
-
-    def test_a_record_says_which_run_it_is_of_which_phone(self):
-        begun = []
-        for _ in range(2):
-            self.run_fake("--record", self.record, "--tag", "serial=C02X", env={"QUAZOR_TAGS": "serial=old station=S3"})
-            begun.append(events_in(self.record)[0])
-        self.assertRegex(begun[0]["id"], "^[0-9a-f]{32}$")
-        self.assertNotEqual(begun[0]["id"], begun[1]["id"])
-        self.assertEqual(begun[0]["host"], socket.gethostname())
-        self.assertEqual(begun[0]["tags"], [["serial", "C02X"], ["station", "S3"]])
-        self.assert_refused(self.run_fake("--tag", "serial"), 64, "--tag 'serial': expected KEY=VALUE")
-        self.assert_refused(self.run_fake(env={"QUAZOR_TAGS": "x="}), 64, "QUAZOR_TAGS 'x=': the value is empty")
 
     def test_every_verdict_is_recorded_and_verifies(self):
         for arguments, code, verdict in (([], 0, "pass"), (["--set", "minimum=1"], 1, "fail"),

@@ -14,7 +14,12 @@ namespace {
 
 std::vector<std::pair<std::string, std::string>> columnsOf(const RunStarted& run) {
   std::string plugins;
-  for (const std::string& plugin : run.plugins) plugins += (plugins.empty() ? "" : "; ") + plugin;
+  std::string_view separator;
+  for (const std::string& plugin : run.plugins) {
+    plugins += separator;
+    plugins += plugin;
+    separator = "; ";
+  }
   std::vector<std::pair<std::string, std::string>> columns = {
       {"run", run.id},          {"date", timestampText(run.date)},          {"host", run.host},
       {"program", run.program}, {"contract", std::to_string(run.contract)}, {"plugins", std::move(plugins)},
