@@ -31,7 +31,7 @@ SIGNS = ("]]>", "\ufffd", "\uffff", "\\u0000", "\\r", "\u2028", ",")  # as in JS
 KINDS = {"a diagnostic: pass", "a diagnostic: fail", "a diagnostic: error", "an experiment: pass",
          "an experiment: error", "a run with tags", "a run with a serial number", "an interrupted run without a record", "an interrupted run with a record", "a run that never began",
          "no results", "many results", "a deep error", "a value that is not finite", "a limit without bounds",
-         "a result: pass", "a result: fail", "a result: none", *(f"a text with {sign!r}" for sign in SIGNS)}
+         "a result: pass", "a result: fail", "a result: error", "a result: none", *(f"a text with {sign!r}" for sign in SIGNS)}
 
 
 def counts_line(records, of_experiments):
@@ -90,7 +90,7 @@ class Comparison:
             junit = report_readers.read_junit(suite)
             self.check_record(f"{where} junit", blurred(junit), blurred(report_readers.expected_of_junit(record)))
             self.check(f"{where}: begin", suite.get("timestamp"), stream.begin)
-            record["error stage"] = junit.get("error stage", "judge")
+            record["error stage"] = junit.get("error stage", "")
         self.check_unrecorded(name, streams[len(records):], suites[len(records):], records, interrupted)
         identity = json.loads(reports["json"])["run"]
         self.check_identity(name, identity, streams, suites)

@@ -66,6 +66,7 @@ std::string_view nameOf(ResultVerdict verdict) {
   switch (verdict) {
     case ResultVerdict::kPass: return "pass";
     case ResultVerdict::kFail: return "fail";
+    case ResultVerdict::kError: return "error";
     case ResultVerdict::kNone: break;
   }
   return "none";
@@ -85,7 +86,7 @@ JudgedResult judgeResult(QZMeasuredResult result) {
   if (!limit || (limit->lowerBound() == nullptr && limit->upperBound() == nullptr)) return {std::move(result)};
   if (const std::string problem = validateLimit(*limit, result.measurement()); !problem.empty()) {
     std::string text = formatMessage("the result %@ cannot be judged: %@", result.name(), problem);
-    return {std::move(result), ResultVerdict::kFail, std::move(text)};
+    return {std::move(result), ResultVerdict::kError, std::move(text)};
   }
   const bool inside = isInside(*limit, result.measurement().value());
   return {std::move(result), inside ? ResultVerdict::kPass : ResultVerdict::kFail};

@@ -96,6 +96,11 @@ bool fitsAny(const UserLimit& limit, const DiagnosticRecord& record) {
 
 }  // namespace
 
+std::string_view LimitCheck::verdictName() const {
+  if (passed) return nameOf(ResultVerdict::kPass);
+  return counts() && !problem.empty() ? nameOf(ResultVerdict::kError) : nameOf(limit.severity);
+}
+
 bool appliesTo(const UserLimit& limit, const std::string& diagnostic) {
   return limit.diagnostic.empty() || matchesName(limit.diagnostic, diagnostic);
 }

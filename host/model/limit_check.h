@@ -25,8 +25,8 @@ struct LimitCheck {
 
   // False if a failure only causes a warning.
   bool counts() const { return limit.severity == LimitSeverity::kFail; }
-  // "pass", "fail" or "warn".
-  std::string_view verdictName() const { return passed ? "pass" : nameOf(limit.severity); }
+  // "pass", "fail", "error" if they cannot be compared, or "warn".
+  std::string_view verdictName() const;
 };
 
 // True if the limit is meant for this diagnostic.

@@ -3,6 +3,7 @@
 #include "contract/message_format.h"
 #include "host/model/limit_check.h"
 #include "host/report/sample_images.h"
+#include "host/report/text_report.h"
 
 #include <algorithm>
 #include <cstddef>
@@ -97,7 +98,7 @@ void appendDiagnosticLine(std::string& csv, const DiagnosticRecord& record, cons
   cells.insert(cells.end(), ofResult.begin(), ofResult.end());
   cells.resize(kDiagnosticColumns.size() - 4);
   if (const DiagnosticErrorPtr& error = record.error; error != nullptr) {
-    cells.emplace_back(record.errorStage ? nameOf(*record.errorStage) : std::string_view());
+    cells.emplace_back(errorStageText(record));
     cells.insert(cells.end(), {error->domain(), std::to_string(error->code()), error->localizedDescription()});
   }
   cells.resize(kDiagnosticColumns.size());

@@ -8,6 +8,7 @@
 #include "host/report/text_report.h"
 
 #include <cstddef>
+#include <cstdint>
 #include <string_view>
 
 namespace quazor {
@@ -51,10 +52,10 @@ JUnitProperties propertiesOf(const JudgedResult& judged) {
 void addResult(JUnitSuite& suite, const JudgedResult& judged) {
   const QZMeasuredResult& result = judged.result;
   const JUnitProperties properties = propertiesOf(judged);
-  if (judged.verdict != ResultVerdict::kFail) return suite.addPass(result.name(), properties);
-  if (!judged.problem.empty()) {
+  if (judged.verdict == ResultVerdict::kError) {
     return suite.addError(result.name(), properties, hostError(HostErrorCode::kCannotBeJudged, judged.problem));
   }
+  if (judged.verdict != ResultVerdict::kFail) return suite.addPass(result.name(), properties);
   suite.addFailure(
       result.name(), properties,
       formatMessage("%@ is %@, limit %@", result.name(), valueText(result.measurement()), limitText(result.limit())));
@@ -102,6 +103,11 @@ void addRun(JUnitProperties& properties, const RunStarted& run) {
   for (const auto& [key, value] : run.tags) properties.add("tag." + key, value);
 }
 
+bool isOfResult(const DiagnosticError& error) {
+  return error.domain() == QuazorHostErrorDomain &&
+         error.code() == static_cast<std::int64_t>(HostErrorCode::kCannotBeJudged);
+}
+
 JUnitSuite suiteOf(const RunStarted& run, const DiagnosticRecord& record) {
   JUnitSuite suite(record.name, record.begin, record.end);
   JUnitProperties& properties = suite.properties();
@@ -117,8 +123,9 @@ JUnitSuite suiteOf(const RunStarted& run, const DiagnosticRecord& record) {
     for (const LimitCheck& check : checksOfResult(checks, i)) addCheck(suite, check);
   }
   if (record.experimentOnly && record.verdict != Verdict::kError) addExperiment(suite, record);
-  if (record.error != nullptr) {
-    suite.addError(record.errorStage ? std::string(nameOf(*record.errorStage)) : "judge", {}, record.error);
+  // If results cannot be judged, their own cases have the errors.
+  if (record.error != nullptr && !isOfResult(*record.error)) {
+    suite.addError(std::string(errorStageText(record)), {}, record.error);
   }
   suite.addLog(record.log);
   return suite;

@@ -135,7 +135,7 @@ Json resultJson(const JudgedResult& judged) {
   Json json = measurementJson(result.name(), result.measurement());
   if (!result.limit()) return json;
   const QZLimit& limit = *result.limit();
-  if (judged.verdict != ResultVerdict::kNone && judged.problem.empty()) {
+  if (judged.verdict == ResultVerdict::kPass || judged.verdict == ResultVerdict::kFail) {
     Json validators = Json::array();
     addValidator(validators, limit, limit.lowerBound(), "GREATER_THAN_OR_EQUAL", "GREATER_THAN");
     addValidator(validators, limit, limit.upperBound(), "LESS_THAN_OR_EQUAL", "LESS_THAN");

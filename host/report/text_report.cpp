@@ -1,10 +1,12 @@
 #include "host/report/text_report.h"
 
 #include "contract/message_format.h"
+#include "host/error/host_error.h"
 #include "host/model/limit_check.h"
 #include "host/text/table.h"
 
 #include <algorithm>
+#include <cstdint>
 #include <string_view>
 #include <utility>
 
@@ -52,7 +54,7 @@ std::string rangeText(const QZLimit& limit) {
 std::string_view colourOfRow(std::string_view verdict) {
   if (verdict == nameOf(ResultVerdict::kPass)) return kGreen;
   if (verdict == nameOf(ResultVerdict::kFail)) return kRed;
-  return verdict == nameOf(LimitSeverity::kWarn) ? kYellow : std::string_view();
+  return verdict == nameOf(ResultVerdict::kNone) ? std::string_view() : kYellow;
 }
 
 void addResultRow(Table& table, const QZMeasuredResult& result, const std::string& limit, std::string_view verdict,
@@ -149,6 +151,14 @@ std::string errorText(const DiagnosticErrorPtr& error, std::string_view indent) 
     link = "caused by ";
   }
   return text;
+}
+
+std::string_view errorStageText(const DiagnosticRecord& record) {
+  if (record.error == nullptr) return {};
+  if (record.errorStage) return nameOf(*record.errorStage);
+  const bool isOfRecord = record.error->domain() == QuazorHostErrorDomain &&
+                          record.error->code() == static_cast<std::int64_t>(HostErrorCode::kNotRecorded);
+  return isOfRecord ? "record" : nameOf(Stage::kAnalyze);
 }
 
 std::string verdictText(const DiagnosticRecord& record, bool colour) {
