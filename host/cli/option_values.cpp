@@ -2,6 +2,7 @@
 
 #include "base/text/input_error.h"
 #include "base/text/utf8.h"
+#include "contract/message_format.h"
 #include "host/error/exit_code.h"
 
 #include <algorithm>
@@ -24,7 +25,7 @@ void addTags(const std::string& source, const std::vector<std::string>& texts, O
   OrderedMap<std::string> added;
   for (const std::string& text : texts) {
     const auto refuse = [&source, &text](const std::string& why) {
-      throw CommandError(ExitCode::kUsage, source + " '" + text + "': " + why);
+      throw CommandError(ExitCode::kUsage, formatMessage("%@ '%@': %@", source, text, why));
     };
     const std::size_t equals = text.find('=');
     if (equals == std::string::npos) refuse("expected KEY=VALUE");
