@@ -201,12 +201,12 @@ def junit_result(case, verdict_of_suite):
 
     limit = Limit(it["limit"], bound("lower"), bound("upper")) if "limit" in it else None
     result = Result(case.get("name"), number(it["value"]), it["unit"], limit, it["verdict"])
-    allowed = {"pass": [[]], "none": [[]], "fail": [["failure"], ["error"]]}[result.verdict]
-    if result.verdict == "fail" and not all(math.isfinite(float(it[key])) for key in ("value", "lower", "upper")
-                                            if key in it):
-        allowed = [["error"]]  # the result cannot be judged
+    allowed = {"pass": [], "none": [], "fail": ["failure"], "error": ["error"]}[result.verdict]
+    finite = all(math.isfinite(float(it[key])) for key in ("value", "lower", "upper") if key in it)
+    if result.verdict in ("pass", "fail") and not finite:
+        raise ValueError(f"{result} cannot be judged")
     found = [one.tag for one in case if one.tag != "properties"]
-    if found not in allowed or (found == ["error"] and verdict_of_suite != "error"):
+    if found != allowed or (found == ["error"] and verdict_of_suite != "error"):
         raise ValueError(f"{result} with {found}")
     return result
 
@@ -241,12 +241,14 @@ def read_junit(suite):
         raise ValueError("a parameter without its source")
     if derived_verdict(suite) != it["verdict"]:
         raise ValueError(f"it says {it['verdict']}, and its test cases {derived_verdict(suite)}")
-    if len(errors) != (it["verdict"] == "error"):
+    # If results cannot be judged, their cases have the errors, and the first of them is that of the run.
+    unjudged = [one for one in cases if one.find("error") is not None and "value" in properties_of(one)]
+    if len(errors) > 1 or bool(errors or unjudged) != (it["verdict"] == "error"):
         raise ValueError(f"{len(errors)} errors of the run")
-    for one in errors:
+    for one in errors or unjudged[:1]:
         error = one.find("error")
         record["junit errors"] = [error.get("type"), error.get("message"), error.text]
-        record["error stage"] = one.get("name")
+        record["error stage"] = one.get("name") if errors else "analyze"
     return record
 
 
@@ -299,7 +301,7 @@ def read_csv(rows):
                               it["resultVerdict"]))
     errors = [Error(first["errorDomain"], int(first["errorCode"]), first["errorMessage"])] if first["errorCode"] else []
     return {"name": first["diagnostic"], "verdict": first["verdict"], "results": results, "errors": errors,
-            "error stage": first["errorStage"] or "judge"}
+            "error stage": first["errorStage"]}
 
 
 def expected_of_csv(record):

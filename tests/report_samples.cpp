@@ -84,6 +84,9 @@ constexpr std::string_view kFragments[] = {"frames",
                                            "\xC2\xC2\x80",
                                            std::string_view("\0", 1)};
 
+// Parts of tags, which have no control characters and no invalid UTF-8.
+constexpr std::string_view kWords[] = {"C02X", "a,b", "\"quoted\"", "line 3", "=1+1", "\xC3\xA9", "<&>", "it's", "\\n"};
+
 constexpr double kNumbers[] = {0,
                                -0.0,
                                1,
@@ -125,6 +128,12 @@ class Generator {
     for (std::size_t i = upTo(2); i > 0; --i) sample.run.plugins.push_back(text());
     sample.run.seed = random_();
     sample.run.ofExperiments = oneIn(4);
+    sample.run.id = std::to_string(random_());
+    sample.run.host = oneOf(kWords);
+    for (std::size_t i = upTo(3); i > 0; --i) {
+      sample.run.tags.set(oneIn(2) ? "serial" : std::to_string(i) + std::string(oneOf(kWords)),
+                          std::string(oneOf(kWords)));
+    }
     for (std::size_t i = upTo(4); i > 0; --i) {
       sample.records.push_back(sample.run.ofExperiments ? experiment() : diagnostic());
       sample.run.names.push_back(sample.records.back().name);

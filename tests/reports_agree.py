@@ -29,9 +29,9 @@ INTERRUPTION = report_readers.Error("QuazorHostErrorDomain", 11, "it was interru
 SIGNS = ("]]>", "\ufffd", "\uffff", "\\u0000", "\\r", "\u2028", ",")  # as in JSON
 # The samples must contain some of each.
 KINDS = {"a diagnostic: pass", "a diagnostic: fail", "a diagnostic: error", "an experiment: pass",
-         "an experiment: error", "an interrupted run without a record", "an interrupted run with a record", "a run that never began",
+         "an experiment: error", "a run with tags", "a run with a serial number", "an interrupted run without a record", "an interrupted run with a record", "a run that never began",
          "no results", "many results", "a deep error", "a value that is not finite", "a limit without bounds",
-         "a result: pass", "a result: fail", "a result: none", *(f"a text with {sign!r}" for sign in SIGNS)}
+         "a result: pass", "a result: fail", "a result: error", "a result: none", *(f"a text with {sign!r}" for sign in SIGNS)}
 
 
 def counts_line(records, of_experiments):
@@ -90,10 +90,39 @@ class Comparison:
             junit = report_readers.read_junit(suite)
             self.check_record(f"{where} junit", blurred(junit), blurred(report_readers.expected_of_junit(record)))
             self.check(f"{where}: begin", suite.get("timestamp"), stream.begin)
-            record["error stage"] = junit.get("error stage", "judge")
+            record["error stage"] = junit.get("error stage", "")
         self.check_unrecorded(name, streams[len(records):], suites[len(records):], records, interrupted)
-        self.compare_csv(name, report_readers.csv_rows(reports["csv"]), of_experiments, records)
+        identity = json.loads(reports["json"])["run"]
+        self.check_identity(name, identity, streams, suites)
+        rows = self.without_identity(name, report_readers.csv_rows(reports["csv"]), identity)
+        self.compare_csv(name, rows, of_experiments, records)
         self.compare_text(name, report_readers.Lines(reports["text"]), of_experiments, records, interrupted)
+
+    def check_identity(self, name, run, streams, suites):
+        self.kinds["a run with tags"] += len(run["tags"]) > 1
+        self.kinds["a run with a serial number"] += "serial" in run["tags"]
+        for suite in suites:
+            found = report_readers.properties_of(suite)
+            tags = {key[len("tag."):]: value for key, value in found.items() if key.startswith("tag.")}
+            self.check(f"{name} junit: run", (found["run"], found["host"], tags), (run["id"], run["host"], run["tags"]))
+        for stream in streams:
+            found = stream.start["metadata"]
+            self.check(f"{name} ocp: run", (found["run"], found["host"], found.get("tags", {})),
+                       (run["id"], run["host"], run["tags"]))
+            serials = [one["serialNumber"] for one in stream.start["dutInfo"].get("hardwareInfos", [])]
+            self.check(f"{name} ocp: serial number", serials,
+                       [run["tags"]["serial"]] if "serial" in run["tags"] else [])
+
+    def without_identity(self, name, rows, run):
+        """The lines of a table without the cells that say which run it was."""
+        cells = {"run": run["id"], "date": run["date"], "host": run["host"], "program": run["program"],
+                 "contract": str(run["contract"]), "plugins": "; ".join(run["plugins"]), "phone": run["phone"],
+                 "seed": str(run["seed"]), **{f"tag.{key}": value for key, value in run["tags"].items()}}
+        for place, row in enumerate(rows):
+            expected = list(cells.values() if place else cells)
+            self.check(f"{name} csv: run", row[-len(expected):], expected)
+            del row[-len(expected):]
+        return rows
 
     def check_unrecorded(self, name, streams, suites, records, interrupted):
         self.check(f"{name}: unrecorded", [one.get("name") for one in suites],

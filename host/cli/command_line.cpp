@@ -2,6 +2,7 @@
 
 #include "base/text/nearest_name.h"
 #include "contract/contract.h"
+#include "host/cli/option_values.h"
 #include "host/device/phone.h"
 #include "host/text/table.h"
 
@@ -54,6 +55,8 @@ struct RawOptions {
   std::vector<std::string> names;
   std::vector<std::string> plugins;
   std::vector<std::string> settings;
+  std::vector<std::string> limits;
+  std::vector<std::string> tags;
   std::vector<std::string> parameterFiles;
   std::vector<std::string> records;
   std::vector<std::string> outputs;
@@ -98,8 +101,8 @@ void removeMarks(RawOptions& raw) {
   const auto removeMark = [](std::string& text) {
     if (text.starts_with(kMark)) text.erase(0, 1);
   };
-  for (std::vector<std::string>* texts :
-       {&raw.names, &raw.plugins, &raw.settings, &raw.parameterFiles, &raw.records, &raw.outputs, &raw.deadlines}) {
+  for (std::vector<std::string>* texts : {&raw.names, &raw.plugins, &raw.settings, &raw.limits, &raw.tags,
+                                          &raw.parameterFiles, &raw.records, &raw.outputs, &raw.deadlines}) {
     std::for_each(texts->begin(), texts->end(), removeMark);
   }
   for (std::string* text : {&raw.profile, &raw.phone, &raw.record, &raw.of, &raw.seed, &raw.seeds, &raw.memory}) {
@@ -139,8 +142,11 @@ void addProcessOptions(CLI::App& command, RawOptions& raw) {
 
 void addParameterOptions(CLI::App& command, RawOptions& raw) {
   command
-      .add_option("--profile", raw.profile, "Read parameter values from this file; 'none' skips the default profile")
-      ->type_name("FILE");
+      .add_option(
+          "--profile", raw.profile,
+          "Read parameter values and limits from this file or installed profile, for example strict; 'none' skips "
+          "the default profile")
+      ->type_name("FILE|NAME");
   addRepeatable(command, "--parameters", raw.parameterFiles,
                 "Read more parameter values from this file, which has the format of a profile; repeatable", "FILE");
   addRepeatable(command, "--set", raw.settings,
@@ -148,6 +154,21 @@ void addParameterOptions(CLI::App& command, RawOptions& raw) {
                 "QUAZOR_SET holds settings in the same form, separated by spaces. Precedence, highest first: --set, "
                 "QUAZOR_SET, --parameters, --profile",
                 "[experiment.|analysis.]NAME=VALUE");
+}
+
+void addTags(CLI::App& command, RawOptions& raw) {
+  addRepeatable(
+      command, "--tag", raw.tags,
+      "Keep this in the record and the reports, for example serial=C02X; repeatable. The environment variable "
+      "QUAZOR_TAGS holds tags in the same form, separated by spaces",
+      "KEY=VALUE");
+}
+
+void addLimits(CLI::App& command, RawOptions& raw) {
+  addRepeatable(command, "--limit", raw.limits,
+                "Also judge results by this limit, such as 'BackTele.Total >= 90', '*.FrameOffset in [-2, 2]' or "
+                "'A.Total == B.Total +- 1'; repeatable. It can only make a verdict stricter",
+                "[DIAGNOSTIC:]RESULT OP NUMBER [UNIT] [+- TOLERANCE]");
 }
 
 void addLogOptions(CLI::App& command, RawOptions& raw) {
@@ -296,9 +317,11 @@ Options optionsOf(const CLI::App& command, const RawOptions& raw) {
   options.seeds = parseWhole("--seeds", raw.seeds, 1, 1'000'000);
   options.memory = memoryOf(raw.memory);
   for (const std::string& text : raw.settings) options.settings.push_back(parseOverride(text));
+  for (const std::string& text : raw.limits) options.limits.push_back(limitOfCommandLine(text));
   for (const std::string& text : raw.deadlines) options.deadlines.push_back(parseDeadline(text));
   options.logLevel = logLevelOf(raw.logLevel);
   options.systemLog = raw.systemLog;
+  if (command.get_option_no_throw("--tag") != nullptr) options.tags = tagsOf(raw.tags);
   const bool isOfRun = options.command == Command::kRun || options.command == Command::kExperiment ||
                        options.command == Command::kAnalyze;
   options.report = reportOf(raw, isOfRun);
@@ -362,7 +385,10 @@ void declareRunningCommands(CLI::App& app, RawOptions& raw) {
     addReportOptions(*command, raw, formats);
     addParameterOptions(*command, raw);
     addProcessOptions(*command, raw);
+    addTags(*command, raw);
   }
+  addLimits(run, raw);
+  addLimits(analyze, raw);
 }
 
 void declareOtherCommands(CLI::App& app, RawOptions& raw) {

@@ -3,6 +3,7 @@
 
 #include "contract/log_channel.h"
 #include "host/error/exit_code.h"
+#include "host/limits/user_limit.h"
 #include "host/plugin/parameters.h"
 #include "host/plugin/profile.h"
 #include "host/report/run_report.h"
@@ -43,6 +44,8 @@ struct Options {
   std::vector<std::string> names;  // positional arguments: diagnostics or experiments, topics, a shell, "probe"
   std::vector<std::filesystem::path> plugins;  // empty: the installed one
   std::vector<ParameterOverride> settings;
+  std::vector<UserLimit> limits;
+  OrderedMap<std::string> tags;
   std::vector<std::filesystem::path> parameterFiles;
   std::vector<std::filesystem::path> records;  // to read
   std::filesystem::path record;                // to write; empty: none

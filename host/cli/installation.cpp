@@ -43,6 +43,10 @@ std::vector<std::filesystem::path> Installation::allPlugins() const {
 
 std::filesystem::path Installation::defaultProfile() const { return data_ / "profiles" / "default.json"; }
 
+std::filesystem::path Installation::profile(const std::filesystem::path& name) const {
+  return dataFile("profiles", name);
+}
+
 std::filesystem::path Installation::defaultScenario() const { return data_ / "scenarios" / "healthy.json"; }
 
 std::filesystem::path Installation::explanations() const { return data_ / "explanations"; }

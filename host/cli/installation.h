@@ -21,6 +21,8 @@ class Installation {
   // All plug-ins in the directory of defaultPlugin(), sorted by name.
   std::vector<std::filesystem::path> allPlugins() const;
   std::filesystem::path defaultProfile() const;
+  // Resolves the argument of `--profile` like scenario(), among the installed profiles.
+  std::filesystem::path profile(const std::filesystem::path& name) const;
   std::filesystem::path defaultScenario() const;
   std::filesystem::path explanations() const;  // the directory of the explanations
   // Resolves the argument of `--phone`: returns `name` if that file exists, else the installed scenario of that name

@@ -6,6 +6,7 @@ CTest passes the program and the directory of the test plug-ins in the environme
 import json
 import os
 import pathlib
+import re
 import signal
 import subprocess
 import tempfile
@@ -43,6 +44,13 @@ def start(*arguments, ignored=False, **options):
     action = signal.SIG_IGN if ignored else signal.SIG_DFL
     return subprocess.Popen([PROGRAM, *map(str, arguments)], stdout=subprocess.PIPE, stderr=subprocess.PIPE, text=True,
                             preexec_fn=lambda: signal.signal(signal.SIGINT, action), **options)
+
+
+def without_identity(document):
+    """A JSON report without the ID and the date of its run, which differ between two runs."""
+    changed, count = re.subn(r'"run": {\n    "id": "[0-9a-f]{32}",\n    "date": "[0-9TZ:.-]*"', '"run": {', document)
+    assert count == 1, document[-500:]
+    return changed
 
 
 def events_in(record):

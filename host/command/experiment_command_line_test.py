@@ -19,10 +19,15 @@ class ExperimentTest(CommandLineTest):
         return self.run_alone("--set", "duration=2", *arguments, names=["Alone.Counts"], **options)
 
     def rows(self, *arguments, code=0, **options):
-        """The rows of the CSV table, including the header."""
+        """The rows of the CSV table, including the header, without the cells that say which run it was."""
         result = self.run_alone("--format", "csv", *arguments, **options)
         self.assertEqual(result.returncode, code, result.stderr)
-        return list(csv.reader(io.StringIO(result.stdout), strict=True))
+        rows = list(csv.reader(io.StringIO(result.stdout), strict=True))
+        begin = rows[0].index("run")
+        self.assertEqual(rows[0][begin:],
+                         ["run", "date", "host", "program", "contract", "plugins", "phone", "seed"])
+        self.assertEqual({tuple(row[begin:]) for row in rows[1:]}, {tuple(row[begin:]) for row in rows[1:2]})
+        return [row[:begin] for row in rows]
 
     def test_measurements_as_a_table_and_auxiliary_data(self):
         result = self.run_counts("--set", "measured=90")
@@ -50,7 +55,7 @@ class ExperimentTest(CommandLineTest):
         result = self.run_alone("--set", "images=2", "--set", "samples=3", "--seed", "9", "--format", "json")
         self.assertEqual(result.returncode, 0, result.stderr)
         document = json.loads(result.stdout)
-        self.assertEqual(list(document), ["schema", "experiments"])
+        self.assertEqual(list(document), ["schema", "experiments", "run"])
         record, = document["experiments"]
         self.assertEqual(list(record), ["name", "summary", "verdict", "parameters", "measurements", "auxiliaryData",
                                         "error", "log", "faults", "seed", "durations"])
@@ -78,8 +83,8 @@ class ExperimentTest(CommandLineTest):
     def test_csv_into_a_file(self):
         result = self.run_counts("--format", "csv", "--output", self.output)
         self.assertEqual((result.returncode, result.stdout.splitlines()[0]), (0, "DONE  Alone.Counts"))
-        self.assertEqual(self.output.read_text(),
-                         "experiment,measurement,value,unit\nAlone.Counts,Count,0,frames\n")
+        self.assertRegex(self.output.read_text(),
+                         r"^experiment,measurement,value,unit,run,.*\nAlone.Counts,Count,0,frames,[0-9a-f]{32},.*\n$")
 
     def test_csv_is_for_runs_only(self):
         for command in (["list"], ["describe", "Fake.One"]):
@@ -88,7 +93,8 @@ class ExperimentTest(CommandLineTest):
 
     def test_an_error_beside_a_csv_table(self):
         result = self.run_counts("--format", "csv", "--set", "behaviour=5")
-        self.assertEqual((result.returncode, result.stdout), (2, "experiment,measurement,value,unit\n"))
+        self.assertEqual(result.returncode, 2)
+        self.assertRegex(result.stdout, r"^experiment,measurement,value,unit,run,.*\n$")
         self.assertIn("quazor: Alone.Counts ended in an error\n  FakeDomain code 2: run failed\n", result.stderr)
 
     def test_exceptions_become_errors_with_their_text(self):

@@ -1,6 +1,7 @@
 #include "host/command/failed_only.h"
 
 #include "host/device/phone.h"
+#include "host/model/limit_check.h"
 #include "host/record/previous_run.h"
 #include "host/record/record_file.h"
 
@@ -21,7 +22,7 @@ OrderedMap<Value> valuesOf(const std::vector<ResolvedParameter>& parameters) {
 
 void refuseFailedPlugins(const RecordedRun& run) {
   for (const DiagnosticRecord& one : run.records) {
-    if (!one.experimentName.empty()) continue;  // a record without an experiment is that of a plug-in
+    if (!one.experimentName.empty() || isOfLimit(one)) continue;  // a record without an experiment is that of a plug-in
     throw CommandError(
         ExitCode::kCannotRead,
         "the plug-in " + one.name +
@@ -43,6 +44,31 @@ Profile recordedProfile(const std::filesystem::path& record, const RecordedRun& 
   return profile;
 }
 
+// The recorded limits that fit a result of the diagnostics with these names, or may do so: some have no results yet.
+std::vector<UserLimit> limitsOfFailed(const RecordedRun& run, const std::vector<std::string>& names) {
+  std::vector<UserLimit> limits;
+  for (const UserLimit& limit : run.began.limits) {
+    for (const std::string& name : names) {
+      const auto found = std::find_if(run.records.begin(), run.records.end(),
+                                      [&name](const DiagnosticRecord& one) { return one.name == name; });
+      const bool mayFit =
+          appliesTo(limit, name) && (found == run.records.end() || limitsWithoutResult({limit}, {*found}).empty());
+      if (!mayFit) continue;
+      limits.push_back(limit);
+      break;
+    }
+  }
+  return limits;
+}
+
+void refuseOnlyLimits(const RecordedRun& run) {
+  for (const DiagnosticRecord& one : run.records) {
+    if (!isOfLimit(one)) continue;
+    throw CommandError(ExitCode::kUsage, "in that run every diagnostic passed, but the limit '" + one.name +
+                                             "' fits no result; correct the limit and name the diagnostics to run");
+  }
+}
+
 }  // namespace
 
 Options optionsToRunAgain(Options options) {
@@ -53,7 +79,9 @@ Options optionsToRunAgain(Options options) {
   const RecordedRun run = runIn(record);
   refuseFailedPlugins(run);
   options.names = failedNames(run);
+  if (options.names.empty()) refuseOnlyLimits(run);
   options.recorded = recordedProfile(record, run, options.names);
+  options.recorded->limits = limitsOfFailed(run, options.names);
   if (options.plugins.empty()) options.plugins.assign(run.began.plugins.begin(), run.began.plugins.end());
   if (options.phone.empty()) {
     options.phone = run.began.phone;

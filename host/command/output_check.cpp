@@ -42,7 +42,7 @@ std::vector<fs::path> inputsOf(const Options& options, const Installation& insta
   inputs.insert(inputs.end(), options.parameterFiles.begin(), options.parameterFiles.end());
   inputs.insert(inputs.end(), began.plugins.begin(), began.plugins.end());
   inputs.push_back(bindingNamed(began.phone).value_or(began.phone));
-  inputs.push_back(options.profile.empty() ? installation.defaultProfile() : options.profile);
+  inputs.push_back(options.profile.empty() ? installation.defaultProfile() : installation.profile(options.profile));
   inputs.push_back(options.failedOf);
   // Every run reads or replaces the record of the last one.
   if (options.command == Command::kRun) inputs.push_back(previousRunFile());

@@ -33,7 +33,7 @@ class MakingTest(RecordTest):
     def test_a_record_holds_all_of_a_run(self):
         events = events_in(self.recorded("--set", "measured=90", "--seed", "9", names=["Fake.*"]))
         self.assertEqual([event["sequence"] for event in events], list(range(len(events))))
-        self.assertEqual(events[0]["record"], 1)
+        self.assertEqual(events[0]["record"], 2)
         self.assertEqual(events[0]["names"], ["Fake.One", "Fake.Two"])
         self.assertEqual((events[0]["seed"], events[0]["phone"], events[0]["plugins"]), (9, str(self.phone), [WORKING]))
         ended = [event["verdict"] for event in events if event["event"] == "diagnosticEnded"]
@@ -154,11 +154,11 @@ class VerifyTest(RecordTest):
             del events[3]
 
         def other_form(events):
-            events[0]["record"] = 2
+            events[0]["record"] = 3
 
         self.assert_wrong(self.changed(missing_line),
                           "line 4: the sequence number is 4 instead of 3; a line is missing or has been moved")
-        self.assert_wrong(self.changed(other_form), "line 1: the record has format 2, but this program reads format 1")
+        self.assert_wrong(self.changed(other_form), "line 1: the record has format 3, but this program reads formats 1 to 2")
         self.assert_wrong(self.write("text", "hello\n"), "line 1: not valid JSON")
         self.assert_wrong(self.write("document", "{}\n"), "line 1: \"record\" is missing")
         self.assert_wrong(WORKING, "line 1: not valid JSON")

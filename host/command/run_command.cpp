@@ -6,8 +6,10 @@
 #include "host/command/selection.h"
 #include "host/device/phone.h"
 #include "host/error/host_error.h"
+#include "host/model/limit_check.h"
 #include "host/run/event_pipeline.h"
 #include "host/run/isolation.h"
+#include "host/system/identity.h"
 #include "host/system/interrupt_watcher.h"
 #include "host/text/table.h"
 #include "host/text/timestamp.h"
@@ -86,10 +88,22 @@ void tellFailedPlugin(const FailedPlugin& plugin, EventPipeline& events) {
   events.endDiagnostic();
 }
 
+// Reports a limit that fits no result like a diagnostic that ended in an error.
+void tellLimitWithoutResult(const UserLimit& limit, EventPipeline& events) {
+  DiagnosticErrorPtr error = errorOfLimitWithoutResult(limit, events.records());
+  events.onEvent(DiagnosticStarted{
+      canonicalText(limit), "A limit that fits no result of this run.", {}, {}, false, {}, 0, dateNow()});
+  events.onEvent(Failed{Stage::kAnalyze, std::move(error)});
+  events.endDiagnostic();
+}
+
 RunStarted beginningOf(const Options& options, const Installation& installation, const std::vector<Job>& jobs,
                        const std::vector<FailedPlugin>& failed) {
   RunStarted began{QUAZOR_VERSION, QUAZOR_CONTRACT_VERSION, dateNow(), {}, {}, options.seed, false, {}};
   for (const auto& file : isolationOf(options, installation).plugins) began.plugins.push_back(file.string());
+  began.id = randomIdentifier();
+  began.host = nameOfThisMachine();
+  began.tags = options.tags;
   began.ofExperiments = options.command == Command::kExperiment;
   for (const FailedPlugin& plugin : failed) began.names.push_back(plugin.file.filename().string());
   for (const Job& job : jobs) began.names.push_back(job.bound.described.diagnostic.name);
@@ -108,6 +122,7 @@ ExitCode perform(const Options& options, const Installation& installation, Conso
   if (options.inProcess) {
     watcher.emplace([&events] { events.interruptAndLeave([] { ::_exit(static_cast<int>(ExitCode::kInterrupted)); }); });
   }
+  const std::vector<UserLimit> limits = began.limits;
   Conductor conductor(withoutFailed(isolationOf(options, installation), failed), options, runOptions, events);
   events.onEvent(std::move(began));
   for (const FailedPlugin& plugin : failed) tellFailedPlugin(plugin, events);
@@ -117,6 +132,7 @@ ExitCode perform(const Options& options, const Installation& installation, Conso
       return ExitCode::kInterrupted;
     }
   }
+  for (const UserLimit& limit : limitsWithoutResult(limits, events.records())) tellLimitWithoutResult(limit, events);
   events.onEvent(RunEnded{std::nullopt, dateNow()});
   events.requireRecords();
   return events.exitCode();
@@ -165,6 +181,7 @@ ExitCode runCommand(const Options& given, const Installation& installation, Cons
   runOptions.logLevel = options.logLevel.value_or(LogLevel::kDefault);
   RunStarted began = beginningOf(options, installation, jobs, selection.failed);
   began.phone = phone;
+  began.limits = std::move(selection.limits);
   return perform(options, installation, console, std::move(began), jobs, selection.failed, runOptions);
 }
 
@@ -230,6 +247,7 @@ ExitCode analyzeCommand(const Options& given, const Installation& installation, 
   RunStarted began = beginningOf(options, installation, jobs, selection.failed);
   began.phone = run.began.phone;
   began.seed = run.began.seed;
+  began.limits = selection.limits.empty() ? run.began.limits : selection.limits;
   return perform(options, installation, console, std::move(began), jobs, selection.failed, runOptions);
 }
 

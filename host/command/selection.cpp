@@ -43,7 +43,11 @@ std::vector<Profile> profilesOf(const Options& options, const Installation& inst
     profiles.back().mayNameOthers = true;  // the installed profile serves any set of plug-ins
   }
   if (options.recorded) profiles.push_back(*options.recorded);
-  if (!options.withoutProfile && !options.profile.empty()) profiles.push_back(readProfile(options.profile));
+  if (!options.withoutProfile && !options.profile.empty()) {
+    const std::filesystem::path file = installation.profile(options.profile);
+    profiles.push_back(readProfile(file));
+    profiles.back().mayNameOthers = file != options.profile;  // it is an installed one
+  }
   for (const std::filesystem::path& file : options.parameterFiles) profiles.push_back(readProfile(file));
   return profiles;
 }
@@ -121,7 +125,11 @@ Selection select(const Options& options, const Installation& installation) {
     }
   }
   if (!selected.empty()) checkOverrides(settings, selected);
-  Selection selection{{}, std::move(scan.failed)};
+  Selection selection{{}, std::move(scan.failed), {}};
+  for (const Profile& profile : profiles) {
+    selection.limits.insert(selection.limits.end(), profile.limits.begin(), profile.limits.end());
+  }
+  selection.limits.insert(selection.limits.end(), options.limits.begin(), options.limits.end());
   for (DescribedDiagnostic& one : selected) {
     ResolvedParameters parameters = resolveParameters(one, profiles, settings);
     selection.diagnostics.push_back({std::move(one), std::move(parameters)});

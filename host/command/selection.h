@@ -12,6 +12,7 @@ namespace quazor {
 struct Selection {
   std::vector<ResolvedDiagnostic> diagnostics;
   std::vector<FailedPlugin> failed;  // could not be loaded
+  std::vector<UserLimit> limits;     // of the profiles and the command line, in this order
 };
 
 // The plug-ins that the options name, or the installed one, and the limits of their processes.

@@ -16,19 +16,20 @@ inline constexpr std::string_view QuazorHostErrorDomain = "QuazorHostErrorDomain
 
 // Codes of QuazorHostErrorDomain. Reports contain them, so the meaning of a number must not change.
 enum class HostErrorCode : std::int64_t {
-  kNoErrorGiven = 1,     // an operation failed and gave no error
-  kException = 2,        // an operation threw
-  kNothingMade = 3,      // a factory returned null
-  kNothingMeasured = 4,  // the analysis succeeded without a measured result
-  kCannotBeJudged = 5,   // a measured result cannot be compared with its limit
-  kCrashed = 6,          // a signal terminated the plug-in process
-  kExited = 7,           // the plug-in exited from its process
-  kDeadline = 8,         // a stage took longer than its deadline
-  kConnectionLost = 9,   // the plug-in's process closed or overwrote its connection to quazor
-  kNotRecorded = 10,     // the record of the run could not be written
-  kInterrupted = 11,     // the user interrupted the run
-  kNoProcess = 12,       // the process for the diagnostic could not be created
-  kTooDeep = 13,         // the plug-in gave a value that is nested too deeply to be recorded
+  kNoErrorGiven = 1,         // an operation failed and gave no error
+  kException = 2,            // an operation threw
+  kNothingMade = 3,          // a factory returned null
+  kNothingMeasured = 4,      // the analysis succeeded without a measured result
+  kCannotBeJudged = 5,       // a measured result cannot be compared with its limit
+  kCrashed = 6,              // a signal terminated the plug-in process
+  kExited = 7,               // the plug-in exited from its process
+  kDeadline = 8,             // a stage took longer than its deadline
+  kConnectionLost = 9,       // the plug-in's process closed or overwrote its connection to quazor
+  kNotRecorded = 10,         // the record of the run could not be written
+  kInterrupted = 11,         // the user interrupted the run
+  kNoProcess = 12,           // the process for the diagnostic could not be created
+  kTooDeep = 13,             // the plug-in gave a value that is nested too deeply to be recorded
+  kLimitWithoutResult = 14,  // a user-defined limit fits no result of the run
 };
 
 DiagnosticErrorPtr hostError(HostErrorCode code, std::string message);

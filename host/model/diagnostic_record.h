@@ -3,6 +3,7 @@
 
 #include "contract/results.h"
 #include "host/device/phone.h"
+#include "host/limits/user_limit.h"
 #include "host/model/judge.h"
 #include "host/model/run_log.h"
 #include "host/model/stage.h"
@@ -40,6 +41,7 @@ struct DiagnosticRecord {
   std::string analysisName;  // empty for an experiment on its own
   Verdict verdict = Verdict::kError;
   ResolvedParameters parameters;
+  std::vector<UserLimit> limits;  // those that the user set for this diagnostic
   std::vector<JudgedResult> measuredResults;
   OrderedMap<Measurement> measurements;
   Dictionary auxiliaryData;

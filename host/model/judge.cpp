@@ -2,6 +2,7 @@
 
 #include "contract/message_format.h"
 #include "host/model/diagnostic_record.h"
+#include "host/model/limit_check.h"
 
 #include <cmath>
 #include <utility>
@@ -51,12 +52,21 @@ bool isInside(const QZLimit& limit, double value) {
   return true;
 }
 
+// A limit of the user can only make the verdict stricter.
+void addTo(Judgement& judgement, const LimitCheck& check) {
+  if (check.passed || !check.counts() || judgement.problemCode) return;
+  judgement.verdict = Verdict::kFail;
+  if (check.problem.empty()) return;
+  judgement = {Verdict::kError, HostErrorCode::kCannotBeJudged, check.problem};
+}
+
 }  // namespace
 
 std::string_view nameOf(ResultVerdict verdict) {
   switch (verdict) {
     case ResultVerdict::kPass: return "pass";
     case ResultVerdict::kFail: return "fail";
+    case ResultVerdict::kError: return "error";
     case ResultVerdict::kNone: break;
   }
   return "none";
@@ -76,7 +86,7 @@ JudgedResult judgeResult(QZMeasuredResult result) {
   if (!limit || (limit->lowerBound() == nullptr && limit->upperBound() == nullptr)) return {std::move(result)};
   if (const std::string problem = validateLimit(*limit, result.measurement()); !problem.empty()) {
     std::string text = formatMessage("the result %@ cannot be judged: %@", result.name(), problem);
-    return {std::move(result), ResultVerdict::kFail, std::move(text)};
+    return {std::move(result), ResultVerdict::kError, std::move(text)};
   }
   const bool inside = isInside(*limit, result.measurement().value());
   return {std::move(result), inside ? ResultVerdict::kPass : ResultVerdict::kFail};
@@ -107,7 +117,8 @@ RecordJudgement judgeRecord(const DiagnosticRecord& record, bool completed) {
     return {Verdict::kError, hostError(HostErrorCode::kConnectionLost, "the run was not completed")};
   }
   if (record.experimentOnly) return {Verdict::kPass, nullptr};
-  const Judgement judgement = judge(record.measuredResults);
+  Judgement judgement = judge(record.measuredResults);
+  for (const LimitCheck& check : limitChecksOf(record)) addTo(judgement, check);
   if (!judgement.problemCode) return {judgement.verdict, nullptr};
   return {Verdict::kError, hostError(*judgement.problemCode, judgement.problem)};
 }

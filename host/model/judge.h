@@ -14,12 +14,12 @@ namespace quazor {
 
 struct DiagnosticRecord;
 
-enum class ResultVerdict { kPass, kFail, kNone };
+enum class ResultVerdict { kPass, kFail, kError, kNone };
 
 // kFail means that the hardware is faulty; kError means that the state of the hardware is unknown.
 enum class Verdict { kPass, kFail, kError };
 
-std::string_view nameOf(ResultVerdict verdict);  // "pass", "fail", "none"
+std::string_view nameOf(ResultVerdict verdict);  // "pass", "fail", "error", "none"
 std::string_view nameOf(Verdict verdict);        // "pass", "fail", "error"
 
 // A measured result and its verdict.
@@ -32,7 +32,7 @@ struct JudgedResult {
 // A result without a limit, or with a limit without bounds, is informational: kNone, whatever its value.
 //
 // A limited result is kPass inside its bounds and kFail outside; the value of a closed bound is inside, that of an open
-// one outside. A result cannot be judged, and is kFail with a problem, if its value is not finite, a bound is not
+// one outside. A result cannot be judged, and is kError with a problem, if its value is not finite, a bound is not
 // finite or has another unit, or no value can lie between the bounds. That is a defect of the plug-in, not of the
 // hardware.
 JudgedResult judgeResult(QZMeasuredResult result);
@@ -51,8 +51,9 @@ struct RecordJudgement {
   DiagnosticErrorPtr error;  // set exactly when the verdict is kError: the record's own, or the judge's
 };
 
-// kError if the run had an error, the plug-in's part was not completed, or the results cannot be judged; otherwise what
-// the results say. An experiment that runs alone is kPass if it was completed without an error: it is not judged.
+// kError if the run had an error, the plug-in's part was not completed, or the results cannot be judged or compared
+// with the user's limits; otherwise what the results and these limits say. An experiment that runs alone is kPass if it
+// was completed without an error: it is not judged.
 //
 // The verdict that the record holds does not count.
 RecordJudgement judgeRecord(const DiagnosticRecord& record, bool completed);

@@ -55,9 +55,10 @@ TEST(JudgeTable, AgreesWithTheOracleOnEveryValueAndLimit) {
       for (const Bound& upper : bounds) {
         const QZMeasuredResult result = resultWith(value, lower, upper);
         const OracleResult due = oracleResult(result);
-        const ResultVerdict verdict = !due.isLimited                    ? ResultVerdict::kNone
-                                      : due.isJudgeable && due.isInside ? ResultVerdict::kPass
-                                                                        : ResultVerdict::kFail;
+        const ResultVerdict verdict = !due.isLimited     ? ResultVerdict::kNone
+                                      : !due.isJudgeable ? ResultVerdict::kError
+                                      : due.isInside     ? ResultVerdict::kPass
+                                                         : ResultVerdict::kFail;
         const JudgedResult judged = judgeResult(result);
         const std::string row = std::to_string(value) + " in " + textOf(lower) + " to " + textOf(upper);
         ASSERT_EQ(judged.verdict, verdict) << row;

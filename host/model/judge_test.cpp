@@ -123,7 +123,7 @@ TEST(JudgeResult, SaysWhyAResultCannotBeJudged) {
   };
   for (const Row& row : rows) {
     const JudgedResult judgement = judgeResult(row.result);
-    EXPECT_EQ(judgement.verdict, ResultVerdict::kFail) << row.name;
+    EXPECT_EQ(judgement.verdict, ResultVerdict::kError) << row.name;
     EXPECT_EQ(judgement.problem, std::string("the result Count cannot be judged: ") + row.problem) << row.name;
   }
 }
@@ -192,6 +192,7 @@ TEST(Verdicts, HaveNames) {
   EXPECT_EQ(nameOf(Verdict::kError), "error");
   EXPECT_EQ(nameOf(ResultVerdict::kPass), "pass");
   EXPECT_EQ(nameOf(ResultVerdict::kFail), "fail");
+  EXPECT_EQ(nameOf(ResultVerdict::kError), "error");
   EXPECT_EQ(nameOf(ResultVerdict::kNone), "none");
 }
 

@@ -1,5 +1,7 @@
 #include "host/model/record_builder.h"
 
+#include "host/model/limit_check.h"
+
 #include <utility>
 
 namespace quazor {
@@ -23,7 +25,7 @@ std::vector<RunEvent> RecordBuilder::ending(Date date) const {
   return events;
 }
 
-void RecordBuilder::fold(const RunStarted& /*event*/) {}
+void RecordBuilder::fold(const RunStarted& event) { limits_ = event.limits; }
 
 void RecordBuilder::fold(const DiagnosticStarted& event) {
   record_ = DiagnosticRecord();
@@ -33,6 +35,7 @@ void RecordBuilder::fold(const DiagnosticStarted& event) {
   record_.analysisName = event.analysisName;
   record_.experimentOnly = event.experimentOnly;
   record_.parameters = event.parameters;
+  record_.limits = limitsFor(event.name, limits_);
   record_.seed = event.seed;
   record_.begin = event.date;
   record_.end = event.date;

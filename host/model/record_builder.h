@@ -45,6 +45,7 @@ class RecordBuilder final : public RunEventSink {
   void fold(const DiagnosticEnded& event);
   void fold(const RunEnded& event);
 
+  std::vector<UserLimit> limits_;  // of the run
   DiagnosticRecord record_;
   bool open_ = false;
   bool completed_ = false;

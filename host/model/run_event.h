@@ -24,6 +24,10 @@ struct RunStarted {
   std::uint64_t seed = 0;
   bool ofExperiments = false;      // true for experiments on their own
   std::vector<std::string> names;  // of the diagnostics or experiments to run
+  std::vector<UserLimit> limits{};
+  std::string id{};                // random: 128 bits in hexadecimal; empty in records of format 1
+  std::string host{};              // the name of the machine; empty in records of format 1
+  OrderedMap<std::string> tags{};  // of the user, for example serial=C02X
 };
 
 struct DiagnosticStarted {

@@ -1,6 +1,7 @@
 #include "host/plugin/profile.h"
 
 #include "base/json/json_cursor.h"
+#include "base/text/input_error.h"
 #include "host/plugin/diagnostic_registry.h"
 
 #include <cstdint>
@@ -39,14 +40,39 @@ const Value* findIn(const std::vector<ProfileEntry>& entries, const std::string&
   return found;
 }
 
+UserLimit limitOf(const JsonCursor& entry, const std::string& diagnostic, const std::filesystem::path& file) {
+  entry.allowKeys({"limit", "name", "severity"});
+  const JsonCursor text = entry.at("limit");
+  UserLimit limit;
+  try {
+    limit = parseUserLimit(text.text());
+  } catch (const InputError& problem) {
+    text.fail(std::string("is not a limit: ") + problem.what() + ".");
+  }
+  if (!limit.diagnostic.empty())
+    text.fail("names a diagnostic, but a limit of a profile belongs to the diagnostics of its entry.");
+  limit.diagnostic = diagnostic;
+  if (const std::optional<JsonCursor> name = entry.find("name")) limit.name = name->text();
+  if (const std::optional<JsonCursor> severity = entry.find("severity")) {
+    constexpr std::string_view kNames[] = {"fail", "warn"};
+    limit.severity = *limitSeverityNamed(severity->oneOf(kNames, "a severity"));
+  }
+  limit.source = "profile " + file.filename().string();
+  limit.onlyIfSelected = true;
+  return limit;
+}
+
 Profile profileOf(const std::filesystem::path& file, const JsonDocument& json) {
   const JsonCursor document(json);
   document.allowKeys({"schema", "diagnostics", "experiments"});
   document.at("schema").integer(kSchema, kSchema);
   Profile profile{file, {}};
   for (const auto& [name, entry] : document.at("diagnostics").entries()) {
-    entry.allowKeys({"experiment", "analysis"});
+    entry.allowKeys({"experiment", "analysis", "limits"});
     profile.entries.push_back({name, valuesIn(entry, "experiment"), valuesIn(entry, "analysis")});
+    if (const std::optional<JsonCursor> limits = entry.find("limits")) {
+      for (const JsonCursor& one : limits->elements()) profile.limits.push_back(limitOf(one, name, file));
+    }
   }
   if (const std::optional<JsonCursor> experiments = document.find("experiments")) {
     for (const auto& [name, values] : experiments->entries()) {

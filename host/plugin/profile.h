@@ -2,16 +2,24 @@
 //
 //   {
 //     "schema": 1,
-//     "diagnostics": {"CameraSyncDiagnostic.*": {"experiment": {"duration": 3}, "analysis": {}}},
+//     "diagnostics": {
+//       "CameraSyncDiagnostic.*": {
+//         "experiment": {"duration": 3},
+//         "analysis": {},
+//         "limits": [{"limit": "*.Total >= 90", "name": "no frame is lost", "severity": "warn"}]
+//       }
+//     },
 //     "experiments": {"NimbeImageExperiment": {"images": 5}}
 //   }
 //
 // The name of an entry is that of a diagnostic or an experiment, or a pattern (*, ?, [...]) for several. "experiments"
-// is optional; its values apply to experiments that run on their own.
+// is optional; its values apply to experiments that run on their own. A limit (host/limits/user_limit.h) does not name
+// its diagnostic; its name and its severity, "fail" by default, are optional.
 #pragma once
 
 #include "contract/ordered_map.h"
 #include "contract/value.h"
+#include "host/limits/user_limit.h"
 
 #include <filesystem>
 #include <string>
@@ -37,6 +45,7 @@ struct Profile {
   std::vector<ProfileEntry> entries;        // of diagnostics, in the order of the file
   std::vector<ProfileEntry> experiments{};  // in the order of the file; without values for an analysis
   std::string kind = "profile";             // a user-readable name of the kind of file
+  std::vector<UserLimit> limits{};          // in the order of the file
   bool mayNameOthers = false;               // an entry may name a diagnostic that no loaded plug-in has
 
   // The value for a parameter, or null. The entry with the exact name of the diagnostic takes precedence over patterns,

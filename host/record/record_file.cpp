@@ -85,15 +85,23 @@ bool readLine(std::istream& stream, std::string& line) {
   return true;
 }
 
+void addWhatFormat1Lacks(Json& json) {
+  json["limits"] = Json::array();
+  json["id"] = "";
+  json["host"] = "";
+  json["tags"] = Json::array();
+}
+
 RunEvent eventInLine(const std::filesystem::path& file, std::uint64_t sequence, const std::string& line) {
   try {
-    const Json json = parseJsonLine(line);
+    Json json = parseJsonLine(line);
     if (sequence == 0) {
       const Json& format = memberOf(json, "record");
-      if (format != kRecordFormat) {
-        throw InputError("the record has format " + format.dump() + ", but this program reads format " +
-                         std::to_string(kRecordFormat));
+      if (!format.is_number_unsigned() || format < kFirstRecordFormat || format > kRecordFormat) {
+        throw InputError("the record has format " + format.dump() + ", but this program reads formats " +
+                         std::to_string(kFirstRecordFormat) + " to " + std::to_string(kRecordFormat));
       }
+      if (format == kFirstRecordFormat) addWhatFormat1Lacks(json);
     }
     if (memberOf(json, "sequence") != sequence) {
       throw InputError("the sequence number is " + memberOf(json, "sequence").dump() + " instead of " +

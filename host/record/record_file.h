@@ -11,8 +11,9 @@
 
 namespace quazor {
 
-// The version of the record format.
-inline constexpr int kRecordFormat = 1;
+// The version of the record format, and the first version that is still read.
+inline constexpr int kRecordFormat = 2;
+inline constexpr int kFirstRecordFormat = 1;
 
 // Returns the record line of the event, including the line end. `sequence` is the number of events before it.
 std::string recordLine(const RunEvent& event, std::uint64_t sequence);

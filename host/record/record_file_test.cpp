@@ -72,7 +72,7 @@ TEST_F(RecordFileTest, HasALineForEachEventWithItsNumber) {
   write(wholeRun());
   const std::vector<std::string> lines = linesOf(directory_.read("record"));
   ASSERT_EQ(lines.size(), wholeRun().size());
-  EXPECT_THAT(lines[0], StartsWith(R"({"sequence":0,"record":1,"event":"runBegan",)"));
+  EXPECT_THAT(lines[0], StartsWith(R"({"sequence":0,"record":2,"event":"runBegan",)"));
   EXPECT_THAT(lines[1], StartsWith(R"({"sequence":1,"event":"diagnosticBegan",)"));
 }
 
@@ -137,9 +137,27 @@ TEST_F(RecordFileTest, RefusesARecordThatWasChanged) {
   EXPECT_THAT(refusalOfText(changed([](auto& copy) { copy[2] = ""; })), HasSubstr("line 3: not valid JSON"));
   EXPECT_THAT(refusalOfText(changed([](auto& copy) { copy[2] = "[2]"; })), HasSubstr("line 3: expected an object"));
   EXPECT_THAT(refusalOfText(replaced(2, "stageBegan", "stageBegun")), HasSubstr("line 3: unknown event 'stageBegun'"));
-  EXPECT_THAT(refusalOfText(replaced(0, R"("record":1)", R"("record":2)")),
-              HasSubstr("line 1: the record has format 2, but this program reads format 1"));
-  EXPECT_THAT(refusalOfText(replaced(0, R"("record":1)", R"("recorder":1)")), HasSubstr("\"record\" is missing"));
+  EXPECT_THAT(refusalOfText(replaced(0, R"("record":2)", R"("record":3)")),
+              HasSubstr("line 1: the record has format 3, but this program reads formats 1 to 2"));
+  EXPECT_THAT(refusalOfText(replaced(0, R"("record":2)", R"("record":0)")),
+              HasSubstr("line 1: the record has format 0"));
+  EXPECT_THAT(refusalOfText(replaced(0, R"("record":2)", R"("record":"2")")),
+              HasSubstr("line 1: the record has format \"2\""));
+  EXPECT_THAT(refusalOfText(replaced(0, R"("record":2)", R"("recorder":2)")), HasSubstr("\"record\" is missing"));
+}
+
+TEST_F(RecordFileTest, ReadsFormat1) {
+  write(wholeRun());
+  std::string text = directory_.read("record");
+  const auto replace = [&text](std::string_view before, std::string_view after) {
+    text.replace(text.find(before), before.size(), after);
+  };
+  replace(R"("record":2)", R"("record":1)");
+  replace(R"(,"limits":[])", "");
+  directory_.write("record", text);
+  EXPECT_EQ(readRecord(file_).events.size(), wholeRun().size());
+  replace(R"("record":1)", R"("record":2)");
+  EXPECT_THAT(refusalOfText(text), HasSubstr("line 1: \"limits\" is missing"));
 }
 
 TEST_F(RecordFileTest, RefusesAKeyThatALineHasTwice) {

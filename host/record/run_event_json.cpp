@@ -113,6 +113,56 @@ QZLab::Kind kindAt(const Json& json, const char* key) {
   throw InputError("unknown kind of registration '" + name + "'");
 }
 
+Json limitsJson(const std::vector<UserLimit>& limits) {
+  Json json = Json::array();
+  for (const UserLimit& one : limits) {
+    Json limit = {{"limit", losslessText(canonicalText(one))},
+                  {"severity", nameOf(one.severity)},
+                  {"source", losslessText(one.source)},
+                  {"onlyIfSelected", one.onlyIfSelected}};
+    if (!one.name.empty()) limit["name"] = losslessText(one.name);
+    json.push_back(std::move(limit));
+  }
+  return json;
+}
+
+std::vector<UserLimit> limitsAt(const Json& json, const char* key) {
+  std::vector<UserLimit> limits;
+  for (const Json& one : arrayAt(json, key)) {
+    UserLimit limit;
+    try {
+      limit = parseUserLimit(textAt(one, "limit"));
+    } catch (const InputError& problem) {
+      throw InputError("the limit " + memberOf(one, "limit").dump(-1, ' ', true, Json::error_handler_t::replace) +
+                       " cannot be read: " + problem.what());
+    }
+    const std::string severity = get<std::string>(one, "severity");
+    const std::optional<LimitSeverity> known = limitSeverityNamed(severity);
+    if (!known) throw InputError("unknown severity '" + severity + "'");
+    limit.severity = *known;
+    limit.source = textAt(one, "source");
+    limit.onlyIfSelected = get<bool>(one, "onlyIfSelected");
+    if (one.contains("name")) limit.name = textAt(one, "name");
+    limits.push_back(std::move(limit));
+  }
+  return limits;
+}
+
+Json tagsJson(const OrderedMap<std::string>& tags) {
+  Json json = Json::array();
+  for (const auto& [key, value] : tags) json.push_back(Json::array({losslessText(key), losslessText(value)}));
+  return json;
+}
+
+OrderedMap<std::string> tagsAt(const Json& json, const char* key) {
+  OrderedMap<std::string> tags;
+  for (const Json& one : arrayAt(json, key)) {
+    if (!one.is_array() || one.size() != 2) throw InputError("expected a tag: a key and a value");
+    tags.set(textFrom(one[0]), textFrom(one[1]));
+  }
+  return tags;
+}
+
 LogLevel levelAt(const Json& json, const char* key) {
   const std::string name = get<std::string>(json, key);
   for (const LogLevel level : {LogLevel::kError, LogLevel::kDefault, LogLevel::kDebug}) {
@@ -144,13 +194,26 @@ Json jsonOf(const RunStarted& event) {
           {"phone", losslessText(event.phone)},
           {"seed", event.seed},
           {"ofExperiments", event.ofExperiments},
-          {"names", textsJson(event.names)}};
+          {"names", textsJson(event.names)},
+          {"limits", limitsJson(event.limits)},
+          {"id", losslessText(event.id)},
+          {"host", losslessText(event.host)},
+          {"tags", tagsJson(event.tags)}};
 }
 
 RunEvent readRunBegan(const Json& json) {
-  return RunStarted{textAt(json, "program"),          get<int>(json, "contract"), dateAt(json, "date"),
-                    textsAt(json, "plugins"),         textAt(json, "phone"),      get<std::uint64_t>(json, "seed"),
-                    get<bool>(json, "ofExperiments"), textsAt(json, "names")};
+  return RunStarted{textAt(json, "program"),
+                    get<int>(json, "contract"),
+                    dateAt(json, "date"),
+                    textsAt(json, "plugins"),
+                    textAt(json, "phone"),
+                    get<std::uint64_t>(json, "seed"),
+                    get<bool>(json, "ofExperiments"),
+                    textsAt(json, "names"),
+                    limitsAt(json, "limits"),
+                    textAt(json, "id"),
+                    textAt(json, "host"),
+                    tagsAt(json, "tags")};
 }
 
 Json jsonOf(const DiagnosticStarted& event) {

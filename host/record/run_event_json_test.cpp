@@ -37,10 +37,21 @@ std::vector<EventRow> rows() {
   DiagnosticStarted diagnostic = beginningOf("Good");
   diagnostic.experimentOnly = true;
   const DiagnosticErrorPtr error = errorWithMessage("D", -2, "m", nullptr);
+  run.id = "0af3";
+  run.host = "bench 7";
+  run.tags = {{"serial", "C02X"}, {"station", "B\xff"}};
+  RunStarted limited;
+  limited.limits = {parseUserLimit("D*:R >= 2 V"), parseUserLimit("R == \"2\" +- 0.5")};
+  limited.limits[0].name = "enough";
+  limited.limits[0].severity = LimitSeverity::kWarn;
+  limited.limits[0].source = "profile p.json";
+  limited.limits[0].onlyIfSelected = true;
+  limited.limits[1].source = "command line";
   return {
       {run, R"({"event":"runBegan","program":"0.1.0","contract":2,"date":"2026-11-21T01:08:00.000000000Z",)"
             R"("plugins":["p.so"],"phone":"phone.json","seed":18446744073709551615,"ofExperiments":true,)"
-            R"("names":["Good",{"hex":"42ff"}]})"},
+            R"("names":["Good",{"hex":"42ff"}],"limits":[],"id":"0af3","host":"bench 7",)"
+            R"("tags":[["serial","C02X"],["station",{"hex":"42ff"}]]})"},
       {diagnostic,
        R"({"event":"diagnosticBegan","name":"Good","summary":"Its summary.","experiment":"E","analysis":"A",)"
        R"("experimentOnly":true,"parameters":{"experiment":[{"name":"duration","summary":"How long.",)"
@@ -67,6 +78,12 @@ std::vector<EventRow> rows() {
        R"({"event":"diagnosticEnded","verdict":"fail","date":"2026-11-21T01:08:00.007000000Z"})"},
       {RunEnded{"Good", momentAt(7)},
        R"({"event":"runEnded","interrupted":"Good","date":"2026-11-21T01:08:00.007000000Z"})"},
+      {limited, R"({"event":"runBegan","program":"","contract":0,"date":"1970-01-01T00:00:00.000000000Z",)"
+                R"("plugins":[],"phone":"","seed":0,"ofExperiments":false,"names":[],)"
+                R"("limits":[{"limit":"D*:R >= 2 V","severity":"warn","source":"profile p.json",)"
+                R"("onlyIfSelected":true,"name":"enough"},)"
+                R"({"limit":"R == \"2\" +- 0.5","severity":"fail","source":"command line",)"
+                R"("onlyIfSelected":false}],"id":"","host":"","tags":[]})"},
   };
 }
 
@@ -81,6 +98,32 @@ TEST(EventJson, HasAFormForEveryEvent) {
 
 TEST(EventFrom, ReadsEveryEventBack) {
   for (const EventRow& row : rows()) EXPECT_EQ(eventJson(back(row.event)).dump(), row.json);
+}
+
+TEST(EventFrom, ReadsLimitsBack) {
+  const RunEvent limited = rows().back().event;
+  EXPECT_EQ(std::get<RunStarted>(back(limited)).limits, std::get<RunStarted>(limited).limits);
+}
+
+TEST(EventFrom, ReadsTheIdentityOfARunBack) {
+  const RunEvent run = rows().front().event;
+  const auto read = std::get<RunStarted>(back(run));
+  EXPECT_EQ(read.id, "0af3");
+  EXPECT_EQ(read.host, "bench 7");
+  EXPECT_EQ(read.tags, std::get<RunStarted>(run).tags);
+}
+
+TEST(EventFrom, RefusesALimitThatCannotBeRead) {
+  const std::string text = rows().back().json;
+  const auto refusal = [&text](const std::string& before, const std::string& after) {
+    std::string changed = text;
+    changed.replace(changed.find(before), before.size(), after);
+    return thrownText<InputError>([&changed] { return eventFrom(nlohmann::ordered_json::parse(changed)); });
+  };
+  EXPECT_EQ(refusal("D*:R >= 2 V", "D*:R >="),
+            "the limit \"D*:R >=\" cannot be read: a number or the name of a result is missing");
+  EXPECT_EQ(refusal("\"warn\"", "\"mild\""), "unknown severity 'mild'");
+  EXPECT_EQ(refusal("\"source\":\"profile p.json\",", ""), "\"source\" is missing");
 }
 
 TEST(EventFrom, ReadsBackWhatIsLeftOut) {
@@ -162,7 +205,7 @@ TEST(EventFrom, RefusesAnEventWithoutOneOfItsMembers) {
       ++removed;
     }
   }
-  EXPECT_EQ(removed, 49);
+  EXPECT_EQ(removed, 66);
 }
 
 TEST(EventFrom, RefusesMembersOfAnotherKind) {

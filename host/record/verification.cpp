@@ -2,6 +2,7 @@
 
 #include "contract/message_format.h"
 #include "host/error/host_error.h"
+#include "host/model/limit_check.h"
 #include "host/model/record_builder.h"
 
 #include <algorithm>
@@ -47,9 +48,13 @@ class Verifier {
       if (began_) add("the run starts twice");
       began_ = true;
       toRun_ = began->names;
+      limits_ = began->limits;
     } else if (const auto* const ended = std::get_if<RunEnded>(&event)) {
       if (builder_.isOpen()) add("the run ends before " + builder_.record().name + " has ended");
-      if (!ended->interrupted) checkNames();
+      if (!ended->interrupted) {
+        checkNames();
+        checkLimits();
+      }
       ended_ = true;
     } else if (begins == builder_.isOpen()) {
       add(begins ? builder_.record().name + " has not ended when the next diagnostic starts"
@@ -64,9 +69,20 @@ class Verifier {
     }
   }
 
+  void checkLimits() {
+    for (const UserLimit& limit : limitsWithoutResult(limits_, records_)) {
+      const std::string text = canonicalText(limit);
+      const bool isReported = std::any_of(records_.begin(), records_.end(), [&text](const DiagnosticRecord& one) {
+        return isOfLimit(one) && one.name == text;
+      });
+      if (!isReported) add(formatMessage("the limit '%@' fits no result, but this is not recorded as an error", text));
+    }
+  }
+
   void checkVerdict() {
     const DiagnosticRecord& record = builder_.record();
     run_.push_back(record.name);
+    records_.push_back(resultsOf(record));
     RecordJudgement judged = judgeRecord(record, builder_.isCompleted());
     const DiagnosticErrorPtr due = record.error == nullptr ? judged.error : nullptr;
     if (hostError_ != nullptr && isNotRecorded(*hostError_)) {
@@ -81,11 +97,23 @@ class Verifier {
     }
   }
 
+  // What the comparison with limits needs.
+  static DiagnosticRecord resultsOf(const DiagnosticRecord& record) {
+    DiagnosticRecord results;
+    results.name = record.name;
+    results.experimentName = record.experimentName;
+    results.measuredResults = record.measuredResults;
+    results.error = record.error;
+    return results;
+  }
+
   void add(std::string problem) { problems.push_back(std::move(problem)); }
 
   RecordBuilder builder_;
   DiagnosticErrorPtr hostError_;
   std::vector<std::string> toRun_;
+  std::vector<UserLimit> limits_;
+  std::vector<DiagnosticRecord> records_;
   std::vector<std::string> run_;
   bool began_ = false;
   bool ended_ = false;

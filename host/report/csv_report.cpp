@@ -1,7 +1,9 @@
 #include "host/report/csv_report.h"
 
 #include "contract/message_format.h"
+#include "host/model/limit_check.h"
 #include "host/report/sample_images.h"
+#include "host/report/text_report.h"
 
 #include <algorithm>
 #include <cstddef>
@@ -90,23 +92,31 @@ void addLimit(std::vector<std::string>& cells, const std::optional<QZLimit>& lim
   }
 }
 
-// Appends one line. `judged` is null if the diagnostic has no results.
-void appendDiagnosticLine(std::string& csv, const DiagnosticRecord& record, const JudgedResult* judged) {
+// Appends one line. `cells` are those of a result; empty if the diagnostic has none.
+void appendDiagnosticLine(std::string& csv, const DiagnosticRecord& record, const std::vector<std::string>& ofResult) {
   std::vector<std::string> cells{record.name, std::string(nameOf(record.verdict))};
-  if (judged != nullptr) {
-    const Measurement& measurement = judged->result.measurement();
-    cells.insert(cells.end(), {judged->result.name(), defaultText(measurement.value()), measurement.unit().symbol()});
-    addLimit(cells, judged->result.limit());
-    cells.emplace_back(nameOf(judged->verdict));
-  } else {
-    cells.resize(kDiagnosticColumns.size() - 4);
-  }
+  cells.insert(cells.end(), ofResult.begin(), ofResult.end());
+  cells.resize(kDiagnosticColumns.size() - 4);
   if (const DiagnosticErrorPtr& error = record.error; error != nullptr) {
-    cells.emplace_back(record.errorStage ? nameOf(*record.errorStage) : std::string_view());
+    cells.emplace_back(errorStageText(record));
     cells.insert(cells.end(), {error->domain(), std::to_string(error->code()), error->localizedDescription()});
   }
   cells.resize(kDiagnosticColumns.size());
   appendLine(csv, {cells.begin(), cells.end()});
+}
+
+std::vector<std::string> cellsOf(const QZMeasuredResult& result, const std::optional<QZLimit>& limit,
+                                 std::string_view verdict) {
+  const Measurement& measurement = result.measurement();
+  std::vector<std::string> cells = {result.name(), defaultText(measurement.value()), measurement.unit().symbol()};
+  addLimit(cells, limit);
+  cells.emplace_back(verdict);
+  return cells;
+}
+
+// A user-defined limit. A relation has no bounds.
+std::vector<std::string> cellsOf(const LimitCheck& check) {
+  return cellsOf(check.result, boundsOf(check).value_or(QZLimit(labelOf(check.limit))), check.verdictName());
 }
 
 }  // namespace
@@ -147,8 +157,13 @@ std::string diagnosticCsv(const std::vector<DiagnosticRecord>& records) {
   std::string csv;
   appendLine(csv, kDiagnosticColumns);
   for (const DiagnosticRecord& record : records) {
-    for (const JudgedResult& judged : record.measuredResults) appendDiagnosticLine(csv, record, &judged);
-    if (record.measuredResults.empty()) appendDiagnosticLine(csv, record, nullptr);
+    const std::vector<LimitCheck> checks = limitChecksOf(record);
+    for (std::size_t i = 0; i < record.measuredResults.size(); ++i) {
+      const auto& [result, verdict, ignored] = record.measuredResults[i];
+      appendDiagnosticLine(csv, record, cellsOf(result, result.limit(), nameOf(verdict)));
+      for (const LimitCheck& check : checksOfResult(checks, i)) appendDiagnosticLine(csv, record, cellsOf(check));
+    }
+    if (record.measuredResults.empty()) appendDiagnosticLine(csv, record, {});
   }
   return csv;
 }

@@ -116,7 +116,7 @@ TEST(DiagnosticCsv, HasTheErrorOnEachLine) {
 TEST(DiagnosticCsv, HasALineForADiagnosticWithoutResults) {
   DiagnosticRecord record = recordOf("D", Verdict::kError);
   record.measuredResults.clear();
-  EXPECT_EQ(diagnosticCsv({record}), std::string(kDiagnosticHeader) + "D,error,,,,,,,,,,,Domain,-1,it failed\n");
+  EXPECT_EQ(diagnosticCsv({record}), std::string(kDiagnosticHeader) + "D,error,,,,,,,,,,analyze,Domain,-1,it failed\n");
   EXPECT_EQ(diagnosticCsv({}), kDiagnosticHeader);
 }
 

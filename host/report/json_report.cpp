@@ -1,7 +1,9 @@
 #include "host/report/json_report.h"
 
+#include "host/model/limit_check.h"
 #include "host/record/value_json.h"
 
+#include <cstddef>
 #include <utility>
 
 namespace quazor {
@@ -31,14 +33,28 @@ Json limitJson(const std::optional<QZLimit>& limit) {
       {"name", limit->name()}, {"lower", boundJson(limit->lowerBound())}, {"upper", boundJson(limit->upperBound())}};
 }
 
-Json resultsJson(const std::vector<JudgedResult>& results) {
+Json checkJson(const LimitCheck& check) {
+  Json json = {{"limit", canonicalText(check.limit)},
+               {"name", check.limit.name},
+               {"severity", nameOf(check.limit.severity)},
+               {"source", check.limit.source},
+               {"verdict", check.verdictName()}};
+  if (!check.problem.empty()) json["problem"] = check.problem;
+  return json;
+}
+
+Json resultsJson(const DiagnosticRecord& record) {
   Json json = Json::array();
-  for (const auto& [result, verdict, ignored] : results) {
-    json.push_back({{"name", result.name()},
-                    {"value", numberJson(result.measurement().value())},
-                    {"unit", result.measurement().unit().symbol()},
-                    {"limit", limitJson(result.limit())},
-                    {"verdict", nameOf(verdict)}});
+  const std::vector<LimitCheck> checks = limitChecksOf(record);
+  for (std::size_t i = 0; i < record.measuredResults.size(); ++i) {
+    const auto& [result, verdict, ignored] = record.measuredResults[i];
+    Json one = {{"name", result.name()},
+                {"value", numberJson(result.measurement().value())},
+                {"unit", result.measurement().unit().symbol()},
+                {"limit", limitJson(result.limit())},
+                {"verdict", nameOf(verdict)}};
+    for (const LimitCheck& check : checksOfResult(checks, i)) one["userLimits"].push_back(checkJson(check));
+    json.push_back(std::move(one));
   }
   return json;
 }
@@ -96,7 +112,7 @@ Json recordJson(const DiagnosticRecord& record, Json parameters, bool hasAnalysi
                {"summary", record.summary},
                {"verdict", nameOf(record.verdict)},
                {"parameters", std::move(parameters)}};
-  if (hasAnalysis) json["measuredResults"] = resultsJson(record.measuredResults);
+  if (hasAnalysis) json["measuredResults"] = resultsJson(record);
   json["measurements"] = measurementsJson(record.measurements);
   json["auxiliaryData"] = dictionaryJson(record.auxiliaryData);
   json["error"] = errorJson(record.error);

@@ -3,9 +3,12 @@
 #include "contract/message_format.h"
 #include "host/error/host_error.h"
 #include "host/model/incomplete_run.h"
+#include "host/model/limit_check.h"
 #include "host/report/junit_suite.h"
 #include "host/report/text_report.h"
 
+#include <cstddef>
+#include <cstdint>
 #include <string_view>
 
 namespace quazor {
@@ -49,13 +52,36 @@ JUnitProperties propertiesOf(const JudgedResult& judged) {
 void addResult(JUnitSuite& suite, const JudgedResult& judged) {
   const QZMeasuredResult& result = judged.result;
   const JUnitProperties properties = propertiesOf(judged);
-  if (judged.verdict != ResultVerdict::kFail) return suite.addPass(result.name(), properties);
-  if (!judged.problem.empty()) {
+  if (judged.verdict == ResultVerdict::kError) {
     return suite.addError(result.name(), properties, hostError(HostErrorCode::kCannotBeJudged, judged.problem));
   }
+  if (judged.verdict != ResultVerdict::kFail) return suite.addPass(result.name(), properties);
   suite.addFailure(
       result.name(), properties,
       formatMessage("%@ is %@, limit %@", result.name(), valueText(result.measurement()), limitText(result.limit())));
+}
+
+// A failed limit that only warns is a passed case with the verdict "warn".
+void addCheck(JUnitSuite& suite, const LimitCheck& check) {
+  const Measurement& measurement = check.result.measurement();
+  const std::string name = check.result.name() + ": " + labelOf(check.limit);
+  JUnitProperties properties;
+  properties.add("verdict", std::string(check.verdictName()));
+  properties.add("value", defaultText(measurement.value()));
+  properties.add("unit", measurement.unit().symbol());
+  properties.add("limit", labelOf(check.limit));
+  if (const std::optional<QZLimit> bounds = boundsOf(check)) {
+    addBound(properties, "lower", bounds->lowerBound());
+    addBound(properties, "upper", bounds->upperBound());
+  }
+  if (!check.problem.empty()) properties.add("problem", check.problem);
+  if (check.passed || !check.counts()) return suite.addPass(name, properties);
+  if (!check.problem.empty()) {
+    return suite.addError(name, properties, hostError(HostErrorCode::kCannotBeJudged, check.problem));
+  }
+  suite.addFailure(
+      name, properties,
+      formatMessage("%@ is %@, limit %@", check.result.name(), valueText(measurement), labelOf(check.limit)));
 }
 
 // Adds the measurements of an experiment on its own.
@@ -72,6 +98,14 @@ void addRun(JUnitProperties& properties, const RunStarted& run) {
   properties.add("contract", std::to_string(run.contract));
   for (const std::string& plugin : run.plugins) properties.add("plugin", plugin);
   properties.add("phone", run.phone);
+  if (!run.id.empty()) properties.add("run", run.id);
+  if (!run.host.empty()) properties.add("host", run.host);
+  for (const auto& [key, value] : run.tags) properties.add("tag." + key, value);
+}
+
+bool isOfResult(const DiagnosticError& error) {
+  return error.domain() == QuazorHostErrorDomain &&
+         error.code() == static_cast<std::int64_t>(HostErrorCode::kCannotBeJudged);
 }
 
 JUnitSuite suiteOf(const RunStarted& run, const DiagnosticRecord& record) {
@@ -83,10 +117,15 @@ JUnitSuite suiteOf(const RunStarted& run, const DiagnosticRecord& record) {
   addParameters(properties, "experiment", record.parameters.experiment);
   addParameters(properties, "analysis", record.parameters.analysis);
   addRun(properties, run);
-  for (const JudgedResult& one : record.measuredResults) addResult(suite, one);
+  const std::vector<LimitCheck> checks = limitChecksOf(record);
+  for (std::size_t i = 0; i < record.measuredResults.size(); ++i) {
+    addResult(suite, record.measuredResults[i]);
+    for (const LimitCheck& check : checksOfResult(checks, i)) addCheck(suite, check);
+  }
   if (record.experimentOnly && record.verdict != Verdict::kError) addExperiment(suite, record);
-  if (record.error != nullptr) {
-    suite.addError(record.errorStage ? std::string(nameOf(*record.errorStage)) : "judge", {}, record.error);
+  // If results cannot be judged, their own cases have the errors.
+  if (record.error != nullptr && !isOfResult(*record.error)) {
+    suite.addError(std::string(errorStageText(record)), {}, record.error);
   }
   suite.addLog(record.log);
   return suite;

@@ -1,5 +1,6 @@
 #include "host/report/junit_report.h"
 
+#include "host/error/host_error.h"
 #include "host/testing/test_records.h"
 
 #include <gmock/gmock.h>
@@ -82,9 +83,23 @@ TEST(JUnitReport, HasACaseForTheErrorOfAStage) {
                               "caused by Deep code 2: the cause\n</error>\n")));
 }
 
-TEST(JUnitReport, HasTheJudgesErrorBesideTheResults) {
-  EXPECT_THAT(reportOf(record(Verdict::kError)),
-              AllOf(HasSubstr("tests=\"3\" failures=\"0\" errors=\"1\""), HasSubstr("name=\"judge\">\n      <error ")));
+TEST(JUnitReport, HasOneErrorForAResultThatCannotBeJudged) {
+  DiagnosticRecord one = record(Verdict::kPass);
+  one.measuredResults = judgeResults({resultWithMinimum(std::numeric_limits<double>::quiet_NaN(), 90)});
+  const RecordJudgement judged = judgeRecord(one, true);
+  one.verdict = judged.verdict;
+  one.error = judged.error;
+  EXPECT_THAT(reportOf(one), AllOf(HasSubstr("tests=\"1\" failures=\"0\" errors=\"1\""),
+                                   HasSubstr("<property name=\"verdict\" value=\"error\"/>"),
+                                   HasSubstr("<error message=\"the result Count cannot be judged: its value is nan\" "
+                                             "type=\"QuazorHostErrorDomain:5\">")));
+}
+
+TEST(JUnitReport, HasACaseForAnErrorWithoutStage) {
+  DiagnosticRecord one = record(Verdict::kError);
+  EXPECT_THAT(reportOf(one), HasSubstr("name=\"analyze\">\n      <error "));
+  one.error = hostError(HostErrorCode::kNotRecorded, "the disk is full");
+  EXPECT_THAT(reportOf(one), HasSubstr("name=\"record\">\n      <error "));
 }
 
 TEST(JUnitReport, CallsAResultThatCannotBeJudgedAnError) {

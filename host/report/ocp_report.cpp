@@ -3,8 +3,10 @@
 #include "contract/message_format.h"
 #include "host/device/phone.h"
 #include "host/model/incomplete_run.h"
+#include "host/model/limit_check.h"
 #include "host/record/value_json.h"
 #include "host/report/ocp_stream.h"
+#include "host/report/run_identity.h"
 #include "host/report/text_report.h"
 
 #include <algorithm>
@@ -79,9 +81,15 @@ Json startJson(const RunStarted& run, const std::string& name, std::string comma
                const ResolvedParameters& parameters = {}, Json metadata = Json::object()) {
   Json dut = {{"dutInfoId", "phone"}};
   addText(dut, "name", run.phone);
+  if (const std::string serial = serialNumberOf(run); !serial.empty()) {
+    dut["hardwareInfos"] = {{{"hardwareInfoId", "phone"}, {"name", "phone"}, {"serialNumber", serial}}};
+  }
   metadata["seed"] = run.seed;
   metadata["contract"] = run.contract;
   metadata["plugins"] = run.plugins;
+  addText(metadata, "run", run.id);
+  addText(metadata, "host", run.host);
+  for (const auto& [key, value] : run.tags) metadata["tags"][key] = value;
   return {{"name", name},
           {"version", run.program},
           {"commandLine", std::move(commandLine)},
@@ -127,7 +135,7 @@ Json resultJson(const JudgedResult& judged) {
   Json json = measurementJson(result.name(), result.measurement());
   if (!result.limit()) return json;
   const QZLimit& limit = *result.limit();
-  if (judged.verdict != ResultVerdict::kNone && judged.problem.empty()) {
+  if (judged.verdict == ResultVerdict::kPass || judged.verdict == ResultVerdict::kFail) {
     Json validators = Json::array();
     addValidator(validators, limit, limit.lowerBound(), "GREATER_THAN_OR_EQUAL", "GREATER_THAN");
     addValidator(validators, limit, limit.upperBound(), "LESS_THAN_OR_EQUAL", "LESS_THAN");
@@ -152,6 +160,26 @@ Json diagnosisJson(const JudgedResult& judged, bool known) {
           {"type", type},
           {"message", formatMessage("%@ is %@ %@, limit %@", result.name(), result.measurement().value(),
                                     result.measurement().unit().symbol(), limitText(result.limit()))}};
+}
+
+Json diagnosisJson(const LimitCheck& check, bool known) {
+  const char* const type = !known ? "UNKNOWN" : check.passed ? "PASS" : "FAIL";
+  const char* const ending = !known ? "-limit-unknown" : check.passed ? "-limit-pass" : "-limit-fail";
+  const Measurement& measurement = check.result.measurement();
+  return {{"verdict", check.result.name() + ending},
+          {"type", type},
+          {"message", formatMessage("%@ is %@ %@, limit %@", check.result.name(), measurement.value(),
+                                    measurement.unit().symbol(), labelOf(check.limit))}};
+}
+
+// A limit with bounds becomes validators of the measurement if it counts and could be compared.
+void addValidators(Json& measurement, const LimitCheck& check) {
+  const std::optional<QZLimit> bounds = boundsOf(check);
+  if (!bounds || !check.counts() || !check.problem.empty()) return;
+  Json& validators = measurement["validators"];
+  if (validators.is_null()) validators = Json::array();
+  addValidator(validators, *bounds, bounds->lowerBound(), "GREATER_THAN_OR_EQUAL", "GREATER_THAN");
+  addValidator(validators, *bounds, bounds->upperBound(), "LESS_THAN_OR_EQUAL", "LESS_THAN");
 }
 
 // Writes the test run of one record.
@@ -245,15 +273,32 @@ class OcpRecordWriter {
     return json;
   }
 
+  void writeResult(const JudgedResult& one, const std::vector<LimitCheck>& checks, bool known) {
+    Json measurement = resultJson(one);
+    for (const LimitCheck& check : checks) addValidators(measurement, check);
+    stream_.addToStep(kAnalysisStep, "measurement", std::move(measurement), stepEnd_);
+    if (one.verdict != ResultVerdict::kNone) {
+      stream_.addToStep(kAnalysisStep, "diagnosis", diagnosisJson(one, known), stepEnd_);
+    }
+    for (const LimitCheck& check : checks) {
+      const bool warns = !check.passed && !check.counts();
+      Json diagnosis = diagnosisJson(check, known);
+      if (warns) {  // a diagnosis FAIL would make the run fail
+        stream_.addToStep(kAnalysisStep, "log", {{"severity", "WARNING"}, {"message", diagnosis["message"]}}, stepEnd_);
+      } else {
+        stream_.addToStep(kAnalysisStep, "diagnosis", std::move(diagnosis), stepEnd_);
+      }
+    }
+  }
+
   void writeAnalysis() {
     const std::vector<StagePeriod> stages = stagesThat(isOfAnalysis);
     if (stages.empty() && record_.measuredResults.empty()) return;
     beginStep(kAnalysisStep, record_.analysisName, stages);
     const bool known = record_.verdict != Verdict::kError;
-    for (const JudgedResult& one : record_.measuredResults) {
-      stream_.addToStep(kAnalysisStep, "measurement", resultJson(one), stepEnd_);
-      if (one.verdict == ResultVerdict::kNone) continue;
-      stream_.addToStep(kAnalysisStep, "diagnosis", diagnosisJson(one, known), stepEnd_);
+    const std::vector<LimitCheck> checks = limitChecksOf(record_);
+    for (std::size_t i = 0; i < record_.measuredResults.size(); ++i) {
+      writeResult(record_.measuredResults[i], checksOfResult(checks, i), known);
     }
     // An error of the judge belongs to this step. If an earlier stage failed, the analysis has no result.
     const bool hasError = !known && !errorIsWritten_ && record_.errorStage.value_or(Stage::kAnalyze) == Stage::kAnalyze;

@@ -1,6 +1,7 @@
 #include "host/report/record_difference.h"
 
 #include "contract/message_format.h"
+#include "host/model/limit_check.h"
 #include "host/report/text_report.h"
 
 #include <algorithm>
@@ -49,6 +50,10 @@ Facts factsOf(const DiagnosticRecord& record) {
     setFact(
         facts, "result " + result.name(),
         formatMessage("%@, %@, %@", measurementText(result.measurement()), limitText(result.limit()), nameOf(verdict)));
+  }
+  for (const LimitCheck& check : limitChecksOf(record)) {
+    setFact(facts, formatMessage("limit '%@' of %@", canonicalText(check.limit), check.result.name()),
+            std::string(check.verdictName()));
   }
   for (const auto& [key, value] : record.auxiliaryData) setFact(facts, "auxiliary data " + key, defaultText(value));
   return facts;

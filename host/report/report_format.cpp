@@ -8,6 +8,7 @@
 #include "host/report/json_report.h"
 #include "host/report/junit_report.h"
 #include "host/report/ocp_report.h"
+#include "host/report/run_identity.h"
 #include "host/report/text_report.h"
 #include "host/text/table.h"
 
@@ -65,12 +66,15 @@ std::string reportText(Format format, const RunStarted& run, const std::vector<D
                        const std::optional<std::string>& interrupted) {
   switch (format) {
     case Format::kText: return textReport(run, records, interrupted);
-    case Format::kCsv: return run.ofExperiments ? experimentCsv(records) : diagnosticCsv(records);
+    case Format::kCsv: return withRunColumns(run.ofExperiments ? experimentCsv(records) : diagnosticCsv(records), run);
     case Format::kOcp: return ocpReport(run, records, interrupted);
     case Format::kJunit: return junitReport(run, records, interrupted);
     case Format::kJson: break;
   }
-  return documentText(run.ofExperiments ? experimentDocument(records, interrupted) : runDocument(records, interrupted));
+  nlohmann::ordered_json document =
+      run.ofExperiments ? experimentDocument(records, interrupted) : runDocument(records, interrupted);
+  document["run"] = runJson(run);
+  return documentText(document);
 }
 
 void printReport(std::ostream& out, const DiagnosticRecord& record, bool colour, bool blocks) {

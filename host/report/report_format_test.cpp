@@ -4,9 +4,11 @@
 
 #include "host/record/value_json.h"
 #include "host/report/json_report.h"
+#include "host/report/run_identity.h"
 #include "host/testing/test_events.h"
 #include "host/testing/test_records.h"
 #include "host/testing/test_refusals.h"
+#include "host/text/timestamp.h"
 
 #include <gmock/gmock.h>
 #include <gtest/gtest.h>
@@ -64,6 +66,11 @@ class ReportTextTest : public testing::Test {
     return reportText(format, run_, records_, interrupted);
   }
 
+  nlohmann::ordered_json withRun(nlohmann::ordered_json document) const {
+    document["run"] = runJson(run_);
+    return document;
+  }
+
   RunStarted run_ = runOf({"A", "B"});
   std::vector<DiagnosticRecord> records_ = {recordOf("A", Verdict::kPass), recordOf("B", Verdict::kFail)};
 };
@@ -72,7 +79,7 @@ TEST_F(ReportTextTest, HasEachRecordInEveryFormat) {
   EXPECT_THAT(report(Format::kText),
               testing::AllOf(HasSubstr("  PASS\n"), HasSubstr("  FAIL\n"),
                              EndsWith("2 diagnostics: 1 passed, 1 failed, 0 ended in an error\n")));
-  EXPECT_EQ(report(Format::kJson), documentText(runDocument(records_, std::nullopt)));
+  EXPECT_EQ(report(Format::kJson), documentText(withRun(runDocument(records_, std::nullopt))));
   EXPECT_THAT(report(Format::kCsv), testing::AllOf(StartsWith("diagnostic,verdict,"), HasSubstr("\nB,fail,")));
   EXPECT_THAT(report(Format::kJunit), testing::AllOf(StartsWith("<?xml"), HasSubstr("<testsuite name=\"B\"")));
   EXPECT_THAT(report(Format::kOcp), StartsWith("{\"schemaVersion\":"));
@@ -81,9 +88,38 @@ TEST_F(ReportTextTest, HasEachRecordInEveryFormat) {
 TEST_F(ReportTextTest, HasADocumentAndATableOfItsOwnForExperiments) {
   run_.ofExperiments = true;
   for (DiagnosticRecord& record : records_) record.experimentOnly = true;
-  EXPECT_EQ(report(Format::kJson), documentText(experimentDocument(records_, std::nullopt)));
+  EXPECT_EQ(report(Format::kJson), documentText(withRun(experimentDocument(records_, std::nullopt))));
   EXPECT_THAT(report(Format::kCsv), StartsWith("experiment,measurement,"));
   EXPECT_THAT(report(Format::kText), testing::AllOf(HasSubstr("  DONE\n"), HasSubstr("2 experiments: ")));
+}
+
+TEST_F(ReportTextTest, SaysWhichRunItWasInEveryFormatForPrograms) {
+  run_.id = "0af3";
+  run_.host = "bench 7";
+  run_.seed = 5;
+  run_.plugins = {"a.so", "b,c.so"};
+  run_.tags = {{"serial", "C02X"}, {"station", "line \"3\""}};
+  const auto json = nlohmann::ordered_json::parse(report(Format::kJson))["run"];
+  EXPECT_EQ(json["id"], "0af3");
+  EXPECT_EQ(json["host"], "bench 7");
+  EXPECT_EQ(json["seed"], 5);
+  EXPECT_EQ(json["plugins"].dump(), R"(["a.so","b,c.so"])");
+  EXPECT_EQ(json["tags"].dump(), R"({"serial":"C02X","station":"line \"3\""})");
+  const std::string csv = report(Format::kCsv);
+  EXPECT_THAT(csv,
+              HasSubstr(",errorMessage,run,date,host,program,contract,plugins,phone,seed,tag.serial,tag.station\n"));
+  EXPECT_THAT(csv, HasSubstr(",0af3," + timestampText(run_.date) + ",bench 7," + run_.program + "," +
+                             std::to_string(run_.contract) + ",\"a.so; b,c.so\"," + run_.phone +
+                             ",5,C02X,\"line \"\"3\"\"\"\n"));
+  records_[0].error = errorWithMessage("D", 1, "two\nlines", nullptr);
+  EXPECT_THAT(report(Format::kCsv), HasSubstr("\"two\nlines\",0af3,"));
+  const std::string xml = report(Format::kJunit);
+  EXPECT_THAT(xml, HasSubstr("<property name=\"run\" value=\"0af3\"/>"));
+  EXPECT_THAT(xml, HasSubstr("<property name=\"host\" value=\"bench 7\"/>"));
+  EXPECT_THAT(xml, HasSubstr("<property name=\"tag.serial\" value=\"C02X\"/>"));
+  const std::string ocp = report(Format::kOcp);
+  EXPECT_THAT(ocp, HasSubstr(R"("hardwareInfos":[{"hardwareInfoId":"phone","name":"phone","serialNumber":"C02X"}])"));
+  EXPECT_THAT(ocp, HasSubstr(R"("run":"0af3","host":"bench 7","tags":{"serial":"C02X",)"));
 }
 
 TEST_F(ReportTextTest, CountsOneRecordOnlyWhenTheRunWasInterrupted) {

@@ -45,6 +45,8 @@ class RunReport final : public RunEventSink {
   // Hands over the record of the diagnostic that has ended.
   void addRecord(DiagnosticRecord record);
 
+  // The records so far.
+  const std::vector<DiagnosticRecord>& records() const { return records_; }
   // The exit code after the end of the run; kCannotWrite if a report could not be written.
   ExitCode exitCode() const;
 

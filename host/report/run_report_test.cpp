@@ -144,12 +144,16 @@ TEST_F(ExperimentReportTest, WritesTheDocumentOfExperiments) {
   EXPECT_EQ(Json::parse(out_.str())["experiments"].size(), 1U);
 }
 
+// The first line of a table of measurements, and the end of every other line, with the run.
+const std::string kHeader = "experiment,measurement,value,unit,run,date,host,program,contract,plugins,phone,seed\n";
+const std::string kRun = ",,2026-11-21T01:08:00.000000000Z,,0.1.0,2,p.so,phone.json,5\n";
+
 TEST_F(ExperimentReportTest, WritesOneTableAndTellsErrorsBesideIt) {
   RunReport report({Format::kCsv, {}}, console_);
   run(report, {Verdict::kPass, Verdict::kError});
   EXPECT_EQ(out_.str(), "");
   EXPECT_EQ(end(report), ExitCode::kError);
-  EXPECT_EQ(out_.str(), "experiment,measurement,value,unit\nA,Raw,90,frames\nB,Raw,90,frames\n");
+  EXPECT_EQ(out_.str(), kHeader + "A,Raw,90,frames" + kRun + "B,Raw,90,frames" + kRun);
   EXPECT_EQ(err_.str(),
             "quazor: B ended in an error\n  Domain code -1: it failed\n  caused by Deep code 2: the cause\n");
 }
@@ -158,7 +162,7 @@ TEST_F(ExperimentReportTest, WritesTheTableToAFile) {
   RunReport report({Format::kCsv, directory_.path() / "out"}, console_);
   run(report, {Verdict::kPass});
   EXPECT_EQ(end(report), ExitCode::kAllPassed);
-  EXPECT_EQ(directory_.read("out"), "experiment,measurement,value,unit\nA,Raw,90,frames\n");
+  EXPECT_EQ(directory_.read("out"), kHeader + "A,Raw,90,frames" + kRun);
   EXPECT_EQ(out_.str(), "DONE  A\n");
 }
 
@@ -167,7 +171,7 @@ TEST_F(ExperimentReportTest, SpeaksOfExperimentsWhenInterruptedBetweenTwo) {
   run(report, {Verdict::kPass});
   end(report, "");
   EXPECT_EQ(err_.str(), "quazor: interrupted while no experiment was running\n");
-  EXPECT_THAT(out_.str(), HasSubstr("A,Raw,90,frames\n"));
+  EXPECT_THAT(out_.str(), HasSubstr("A,Raw,90,frames" + kRun));
 }
 
 TEST_F(RunReportTest, PointsOutUnfiredFaults) {

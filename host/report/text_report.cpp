@@ -1,9 +1,12 @@
 #include "host/report/text_report.h"
 
 #include "contract/message_format.h"
+#include "host/error/host_error.h"
+#include "host/model/limit_check.h"
 #include "host/text/table.h"
 
 #include <algorithm>
+#include <cstdint>
 #include <string_view>
 #include <utility>
 
@@ -48,21 +51,44 @@ std::string rangeText(const QZLimit& limit) {
   return text;
 }
 
-void printResults(std::ostream& out, const std::vector<JudgedResult>& results, bool colour) {
+std::string_view colourOfRow(std::string_view verdict) {
+  if (verdict == nameOf(ResultVerdict::kPass)) return kGreen;
+  if (verdict == nameOf(ResultVerdict::kFail)) return kRed;
+  return verdict == nameOf(ResultVerdict::kNone) ? std::string_view() : kYellow;
+}
+
+void addResultRow(Table& table, const QZMeasuredResult& result, const std::string& limit, std::string_view verdict,
+                  bool colour) {
+  const Measurement& measurement = result.measurement();
+  const std::string_view before = colour ? colourOfRow(verdict) : std::string_view();
+  table.addRow({printable(result.name()), defaultText(measurement.value()), printable(measurement.unit().symbol()),
+                limit, verdict == nameOf(ResultVerdict::kNone) ? "-" : std::string(verdict)},
+               std::string(before), std::string(before.empty() ? std::string_view() : kPlain));
+}
+
+void printResults(std::ostream& out, const DiagnosticRecord& record, bool colour) {
   using Align = Table::Align;
   Table table({Align::kLeft, Align::kRight, Align::kLeft, Align::kLeft, Align::kLeft});
   table.addRow({"Result", "Value", "Unit", "Limit", "Verdict"});
-  for (const auto& [result, verdict, ignored] : results) {
-    const Measurement& measurement = result.measurement();
-    std::string_view before;
-    if (verdict == ResultVerdict::kPass) before = kGreen;
-    if (verdict == ResultVerdict::kFail) before = kRed;
-    if (!colour) before = {};
-    table.addRow({printable(result.name()), defaultText(measurement.value()), printable(measurement.unit().symbol()),
-                  limitText(result.limit()), verdict == ResultVerdict::kNone ? "-" : std::string(nameOf(verdict))},
-                 std::string(before), std::string(before.empty() ? std::string_view() : kPlain));
+  const std::vector<LimitCheck> checks = limitChecksOf(record);
+  for (std::size_t i = 0; i < record.measuredResults.size(); ++i) {
+    const JudgedResult& one = record.measuredResults[i];
+    addResultRow(table, one.result, limitText(one.result.limit()), nameOf(one.verdict), colour);
+    for (const LimitCheck& check : checksOfResult(checks, i)) {
+      addResultRow(table, check.result, printable(labelOf(check.limit)), check.verdictName(), colour);
+    }
   }
   table.print(out, "  ");
+}
+
+std::size_t warningsIn(const std::vector<DiagnosticRecord>& records) {
+  std::size_t warnings = 0;
+  for (const DiagnosticRecord& record : records) {
+    const std::vector<LimitCheck> checks = limitChecksOf(record);
+    warnings += static_cast<std::size_t>(std::count_if(
+        checks.begin(), checks.end(), [](const LimitCheck& one) { return !one.passed && !one.counts(); }));
+  }
+  return warnings;
 }
 
 void printHalf(std::ostream& out, std::string_view title, const std::string& name, const QZDescription& description,
@@ -127,6 +153,14 @@ std::string errorText(const DiagnosticErrorPtr& error, std::string_view indent) 
   return text;
 }
 
+std::string_view errorStageText(const DiagnosticRecord& record) {
+  if (record.error == nullptr) return {};
+  if (record.errorStage) return nameOf(*record.errorStage);
+  const bool isOfRecord = record.error->domain() == QuazorHostErrorDomain &&
+                          record.error->code() == static_cast<std::int64_t>(HostErrorCode::kNotRecorded);
+  return isOfRecord ? "record" : nameOf(Stage::kAnalyze);
+}
+
 std::string verdictText(const DiagnosticRecord& record, bool colour) {
   const std::string word(wordOf(record));
   return colour ? std::string(colourOf(record.verdict)) + word + std::string(kPlain) : word;
@@ -136,7 +170,7 @@ void printRecord(std::ostream& out, const DiagnosticRecord& record, bool colour)
   out << printable(record.name) << '\n' << indentedLines(record.summary, "  ");
   if (!record.measuredResults.empty()) {
     out << '\n';
-    printResults(out, record.measuredResults, colour);
+    printResults(out, record, colour);
   }
   out << "\n  " << verdictText(record, colour) << '\n';
   if (record.verdict == Verdict::kError) out << errorText(record.error, "    ");
@@ -155,7 +189,11 @@ void printSummary(std::ostream& out, const std::vector<DiagnosticRecord>& record
   };
   out << count(records.size(), records.size() == 1 ? "diagnostic" : "diagnostics") << ": "
       << count(countOf(Verdict::kPass), "passed") << ", " << count(countOf(Verdict::kFail), "failed") << ", "
-      << count(countOf(Verdict::kError), "ended in an error") << '\n';
+      << count(countOf(Verdict::kError), "ended in an error");
+  if (const std::size_t warnings = warningsIn(records); warnings > 0) {
+    out << ", " << count(warnings, warnings == 1 ? "warning" : "warnings");
+  }
+  out << '\n';
 }
 
 void printUnfiredFaults(std::ostream& out, const DiagnosticRecord& record) {

@@ -17,6 +17,10 @@ std::string limitText(const std::optional<QZLimit>& limit);
 // The error and its underlying errors, one line each, the nearest first.
 std::string errorText(const DiagnosticErrorPtr& error, std::string_view indent);
 
+// The stage of the record's error for tables: that of the analysis if its results cannot be judged, "record" if the
+// record could not be written; empty without an error.
+std::string_view errorStageText(const DiagnosticRecord& record);
+
 // "PASS", "FAIL" or "ERROR"; "DONE" for an experiment on its own that returned a result.
 std::string verdictText(const DiagnosticRecord& record, bool colour);
 

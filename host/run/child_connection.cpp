@@ -2,19 +2,14 @@
 
 #include "base/json/json_limits.h"
 #include "base/json/json_line.h"
-#include "base/text/hexadecimal.h"
 #include "base/text/input_error.h"
 #include "contract/value.h"
 
-#include <sys/random.h>
 #include <unistd.h>
 
-#include <array>
 #include <cerrno>
 #include <cstddef>
-#include <cstdint>
 #include <cstdlib>
-#include <system_error>
 #include <utility>
 
 namespace quazor {
@@ -23,7 +18,6 @@ namespace {
 
 using Json = nlohmann::ordered_json;
 
-constexpr std::size_t kTokenBytes = 16;
 // The exit code of a child whose connection was closed.
 constexpr int kNoConnection = 113;
 
@@ -32,15 +26,6 @@ std::string secondsText(std::chrono::nanoseconds time) {
 }
 
 }  // namespace
-
-std::string newConnectionToken() {
-  std::array<std::uint8_t, kTokenBytes> bytes;
-  // A request of so few bytes is answered in full.
-  if (::getrandom(bytes.data(), bytes.size(), 0) < 0) {
-    throw std::system_error(errno, std::generic_category(), "getting random bytes");
-  }
-  return hexadecimal(bytes);
-}
 
 ConnectionWriter::ConnectionWriter(int descriptor, std::string token)
     : descriptor_(descriptor), token_(std::move(token)), owner_(::getpid()) {}

@@ -15,11 +15,10 @@
 
 namespace quazor {
 
-// A new random text of 32 characters. It begins every line of one connection, so that a plug-in that comes upon the
-// descriptor and writes valid JSON to it is not believed. Throws std::system_error.
-std::string newConnectionToken();
-
 // The child's end of the connection, which carries one JSON document per line.
+//
+// Every line begins with the connection's token, a randomIdentifier(), so that a plug-in that comes upon the descriptor
+// and writes valid JSON to it is not believed.
 // Thread: one at a time.
 class ConnectionWriter {
  public:

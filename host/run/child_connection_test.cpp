@@ -17,13 +17,6 @@ namespace {
 
 using Json = nlohmann::ordered_json;
 
-TEST(ConnectionToken, IsDifferentEachTime) {
-  const std::string token = newConnectionToken();
-  EXPECT_EQ(token.size(), 32U);
-  EXPECT_EQ(token.find_first_not_of("0123456789abcdef"), std::string::npos);
-  EXPECT_NE(token, newConnectionToken());
-}
-
 // What a process with that body writes to its connection.
 std::string written(const std::function<void(const ConnectionWriter& connection)>& body) {
   const DefaultRequestsToEnd defaults;

@@ -42,6 +42,8 @@ class EventPipeline final : public RunEventSink {
   // not read, `leave` is called after a timeout.
   void interruptAndLeave(const std::function<void()>& leave);
 
+  // The records of the diagnostics that have ended.
+  const std::vector<DiagnosticRecord>& records() const { return report_.records(); }
   ExitCode exitCode() const { return report_.exitCode(); }
   // Throws a CommandError (kCannotWrite) if a requested record is incomplete.
   void requireRecords() const;

@@ -9,6 +9,7 @@
 #include "host/record/run_event_json.h"
 #include "host/run/child_connection.h"
 #include "host/run/event_order.h"
+#include "host/system/identity.h"
 #include "host/system/shared_counter.h"
 #include "host/system/supervision.h"
 #include "host/text/timestamp.h"
@@ -188,7 +189,7 @@ bool superviseRun(const IsolationOptions& options, WatchedSignals& signals, cons
   };
   std::optional<ChildProcess> child;
   try {
-    token = newConnectionToken();
+    token = randomIdentifier();
     child.emplace(signals, speak, options.memory, isCleanupProcess);
   } catch (const std::system_error& problem) {
     events.onEvent(Failed{Stage::kLoad,

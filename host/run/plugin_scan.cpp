@@ -10,6 +10,7 @@
 #include "host/record/lossless_json.h"
 #include "host/record/run_event_json.h"
 #include "host/run/child_connection.h"
+#include "host/system/identity.h"
 #include "host/system/supervision.h"
 
 #include <algorithm>
@@ -38,7 +39,7 @@ struct Conversation {
 
 // Throws std::system_error if the process cannot be created.
 Supervised converse(const IsolationOptions& options, WatchedSignals& signals, const Conversation& conversation) {
-  const std::string token = newConnectionToken();
+  const std::string token = randomIdentifier();
   const auto speak = [&](int descriptor) { conversation.speak(ConnectionWriter(descriptor, token)); };
   ChildProcess child(signals, speak, options.memory, isCleanupProcess);
   Supervision supervision;

@@ -19,6 +19,7 @@ using namespace std::chrono_literals;
 using std::chrono::steady_clock;
 using testing::ElementsAre;
 using testing::IsEmpty;
+using testing::StartsWith;
 
 class SupervisionTest : public testing::Test {
  protected:
@@ -254,7 +255,13 @@ TEST_F(SupervisionTest, EndsAChildThatWritesALineWithoutEndAndTakesNoMoreOfIt) {
 }
 
 TEST_F(SupervisionTest, TellsOfALineWithoutEndOfAChildThatHasEnded) {
-  EXPECT_EQ(run([](int connection) { say(connection, std::string(kMaxLine + 1, 'x')); }), "line too long, exit code 0");
+  // On a busy machine the signal is sometimes in time, so the child gets several attempts to end before it.
+  std::string end;
+  for (int i = 0; i < 20 && end != "line too long, exit code 0"; ++i) {
+    end = run([](int connection) { say(connection, std::string(kMaxLine + 1, 'x')); });
+    EXPECT_THAT(end, StartsWith("line too long, "));
+  }
+  EXPECT_EQ(end, "line too long, exit code 0");
   EXPECT_THAT(lines_, IsEmpty());
 }
 

@@ -79,13 +79,14 @@ for name, below in {
     "text": ["error"],
     "system": ["error"],
     "device": ["error", "text"],
-    "plugin": ["error", "text"],
-    "model": ["device", "error", "plugin", "text"],
-    "record": ["error", "model", "text"],
-    "report": ["device", "error", "model", "plugin", "record", "system", "text"],
-    "run": ["device", "error", "model", "plugin", "record", "report", "system", "text"],
-    "cli": ["device", "error", "plugin", "report", "run", "text"],
-    "command": ["cli", "device", "error", "model", "plugin", "record", "report", "run", "system", "text"],
+    "limits": ["error", "text"],
+    "plugin": ["error", "limits", "text"],
+    "model": ["device", "error", "limits", "plugin", "text"],
+    "record": ["error", "limits", "model", "text"],
+    "report": ["device", "error", "limits", "model", "plugin", "record", "system", "text"],
+    "run": ["device", "error", "limits", "model", "plugin", "record", "report", "system", "text"],
+    "cli": ["device", "error", "limits", "plugin", "report", "run", "text"],
+    "command": ["cli", "device", "error", "limits", "model", "plugin", "record", "report", "run", "system", "text"],
 }.items():
     ALLOWED["host/" + name] = [*CONTRACT, "base/json", "base/text", *("host/" + folder for folder in below)]
 ALLOWED["host/device"] += BACKENDS

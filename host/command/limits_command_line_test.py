@@ -1,0 +1,142 @@
+"""User-defined limits on the command line, in profiles and in records."""
+
+import json
+import unittest
+
+from command_line_fixture import CommandLineTest, WORKING, events_in, quazor
+
+
+class LimitsTest(CommandLineTest):
+    def run_limited(self, *arguments):
+        return self.run_fake(*arguments)
+
+    def results_of(self, *arguments):
+        done = self.run_limited("--format", "json", *arguments)
+        diagnostic = json.loads(done.stdout)["diagnostics"][0]
+        return done.returncode, diagnostic["verdict"], diagnostic["measuredResults"]
+
+    def setUp(self):
+        super().setUp()
+        code, verdict, results = self.results_of()
+        self.assertEqual((code, verdict), (0, "pass"))
+        self.result = results[0]
+        self.name = self.result["name"]
+        self.value = int(self.result["value"])
+
+    def test_a_limit_makes_a_verdict_stricter(self):
+        for limit, code, verdict in ((f"{self.name} <= {self.value}", 0, "pass"),
+                                     (f"Fake.One:{self.name} < {self.value}", 1, "fail"),
+                                     (f"Fake*:* > {self.value + 1} {self.result['unit']}", 1, "fail"),
+                                     (f"{self.name} > 0 parsecs", 2, "error"),
+                                     (f"{self.name} == Nothing", 2, "error")):
+            with self.subTest(limit=limit):
+                found = self.results_of("--limit", limit)
+                self.assertEqual(found[:2], (code, verdict))
+                self.assertEqual(found[2][0]["verdict"], self.result["verdict"])
+                self.assertEqual([one["limit"] for one in found[2][0]["userLimits"]], [limit])
+                self.assertEqual(found[2][0]["userLimits"][0]["source"], "command line")
+
+    def test_a_limit_without_a_result_is_an_error(self):
+        for limit in (f"{self.name}x > 0", f"Nowhere:{self.name} > 0"):
+            with self.subTest(limit=limit):
+                record = self.directory / "record.jsonl"
+                done = self.run_limited("--limit", limit, "--record", record)
+                self.assertEqual(done.returncode, 2, done.stdout)
+                self.assertIn(f"code 14: the limit '{limit}' (command line) was compared with nothing", done.stdout)
+                self.assertEqual(quazor("verify", record).returncode, 0)
+
+    def test_what_is_not_a_limit_is_refused_before_anything_runs(self):
+        record = self.directory / "record.jsonl"
+        for limit in ("", "Total", "Total = 1", "Total > 1 +- 1", "Total in [2, 1]", "Total > nan"):
+            with self.subTest(limit=limit):
+                done = self.run_limited("--limit", limit, "--record", record)
+                # Without quotation marks, nan is the name of a result.
+                self.assertEqual(done.returncode, 2 if limit.endswith("nan") else 64)
+                if done.returncode == 64:
+                    self.assertIn(f"--limit '{limit}': ", done.stderr)
+                    self.assertFalse(record.exists())
+
+    def profile(self, entry):
+        return self.write("profile.json", json.dumps({"schema": 1, "diagnostics": entry}))
+
+    def test_a_profile_has_limits_with_a_name_and_a_severity(self):
+        limit = {"limit": f"{self.name} < {self.value}", "name": "as small as can be", "severity": "warn"}
+        profile = self.profile({"Fake.*": {"limits": [limit]}})
+        done = self.run_limited("--parameters", profile)
+        self.assertEqual(done.returncode, 0)
+        self.assertRegex(done.stdout, r"as small as can be: Fake\.\*:.* \(profile profile.json\) +warn")
+        code, verdict, results = self.results_of("--parameters", profile)
+        self.assertEqual((code, verdict, results[0]["userLimits"][0]["verdict"]), (0, "pass", "warn"))
+        del limit["severity"]
+        profile = self.profile({"Fake.*": {"limits": [limit]}})
+        self.assertEqual(self.results_of("--parameters", profile)[:2], (1, "fail"))
+
+    def test_a_limit_of_a_profile_counts_only_for_selected_diagnostics(self):
+        profile = json.loads(self.profile({}).read_text())
+        profile["diagnostics"]["Fake.*"] = {"limits": [{"limit": "Nowhere > 0"}]}
+        path = self.write("profile.json", json.dumps(profile))
+        self.assertEqual(self.run_limited("--parameters", path).returncode, 2)
+
+    def test_a_profile_is_refused_with_the_place_of_a_wrong_limit(self):
+        for limit, problem in (({"limit": "A >"}, "a number or the name of a result is missing"),
+                               ({"limit": "D:A > 1"}, "names a diagnostic"),
+                               ({"limit": "A > 1", "severity": "mild"}, "severity"),
+                               ({"name": "x"}, "limit"),
+                               ({"limit": "A > 1", "source": "x"}, "unknown key")):
+            with self.subTest(limit=limit):
+                path = self.profile({"Fake.*": {"limits": [limit]}})
+                done = self.run_limited("--parameters", path)
+                self.assertEqual(done.returncode, 66)
+                self.assertIn(f"{path}:1: ", done.stderr)
+                self.assertIn(problem, done.stderr)
+
+    def test_the_record_keeps_the_limits(self):
+        record = self.directory / "record.jsonl"
+        limit = f"{self.name} < {self.value}"
+        self.assertEqual(self.run_limited("--limit", limit, "--record", record).returncode, 1)
+        self.assertEqual(events_in(record)[0]["limits"],
+                         [{"limit": limit, "severity": "fail", "source": "command line", "onlyIfSelected": False}])
+        self.assertEqual(quazor("verify", record).returncode, 0)
+        forged = self.write("forged.jsonl", record.read_text().replace('"verdict":"fail"', '"verdict":"pass"'))
+        done = quazor("verify", forged)
+        self.assertEqual(done.returncode, 1)
+        self.assertIn("the recorded verdict is pass", done.stdout)
+        # The limits of the record hold for a new analysis, unless others are given.
+        for limits, code in (((), 1), (("--limit", f"{self.name} <= {self.value}"), 0)):
+            done = quazor("analyze", record, "--plugin", WORKING, *limits)
+            self.assertEqual(done.returncode, code, done.stdout + done.stderr)
+
+    def test_an_entry_that_was_removed_is_missed(self):
+        record = self.directory / "record.jsonl"
+        self.run_limited("--limit", "Nowhere > 0", "--record", record)
+        events = events_in(record)
+        begin = next(i for i, one in enumerate(events) if one.get("name") == "Nowhere > 0")
+        del events[begin:begin + 3]
+        for sequence, event in enumerate(events):
+            event["sequence"] = sequence
+        forged = self.write("forged.jsonl", "".join(json.dumps(one) + "\n" for one in events))
+        done = quazor("verify", forged)
+        self.assertEqual(done.returncode, 1, done.stdout)
+        self.assertIn("the limit 'Nowhere > 0' fits no result, but this is not recorded as an error", done.stdout)
+
+    def test_failed_diagnostics_are_run_again_with_their_limits(self):
+        limit = f"{self.name} < {self.value}"
+        self.assertEqual(self.run_limited("--limit", limit).returncode, 1)
+        self.assertEqual(quazor("run", "--only", "failed", "--plugin", WORKING).returncode, 1)
+        self.assertEqual(self.run_limited("--limit", "Nowhere > 0").returncode, 2)
+        done = quazor("run", "--only", "failed", "--plugin", WORKING)
+        self.assertEqual(done.returncode, 64)
+        self.assertIn("the limit 'Nowhere > 0' fits no result", done.stderr)
+
+
+class StrictProfileTest(CommandLineTest):
+    def test_finds_what_measured_results_can_show(self):
+        for phone, code in (("healthy", 0), ("camera_sync/frames_dropped", 1), ("camera_sync/frame_rate_drift", 1),
+                            ("camera_sync/start_delayed", 1), ("projector_fault/start_delayed", 1)):
+            with self.subTest(phone=phone):
+                self.assertEqual(quazor("run", "--all", "--phone", phone).returncode, 0)
+                self.assertEqual(quazor("run", "--all", "--phone", phone, "--profile", "strict").returncode, code)
+
+
+if __name__ == "__main__":
+    unittest.main()

@@ -1,0 +1,199 @@
+#include "host/model/limit_check.h"
+
+#include "base/text/nearest_name.h"
+#include "contract/message_format.h"
+#include "host/error/host_error.h"
+#include "host/model/diagnostic_record.h"
+#include "host/plugin/diagnostic_registry.h"
+
+#include <algorithm>
+#include <cmath>
+#include <cstdint>
+#include <iterator>
+#include <optional>
+
+namespace quazor {
+
+namespace {
+
+bool holds(LimitOperator comparison, double value, double other, double tolerance) {
+  switch (comparison) {
+    case LimitOperator::kLess: return value < other;
+    case LimitOperator::kLessOrEqual: return value <= other;
+    case LimitOperator::kGreater: return value > other;
+    case LimitOperator::kGreaterOrEqual: return value >= other;
+    case LimitOperator::kEqual: break;
+  }
+  return value >= other - tolerance && value <= other + tolerance;
+}
+
+// Performs one comparison, with one overload per kind of condition. They return why it is impossible, or nothing.
+class Comparison {
+ public:
+  Comparison(LimitCheck& check, const std::vector<JudgedResult>& results)
+      : check_(check), measured_(check.result.measurement()), results_(results) {}
+
+  std::string operator()(const NumberCondition& condition) {
+    if (std::string problem = validate(condition.unit); !problem.empty()) return problem;
+    check_.passed = holds(condition.comparison, measured_.value(), condition.number, condition.tolerance);
+    return {};
+  }
+
+  std::string operator()(const IntervalCondition& condition) {
+    if (std::string problem = validate(condition.unit); !problem.empty()) return problem;
+    const double value = measured_.value();
+    const bool aboveLower = condition.lowerOpen ? value > condition.lower : value >= condition.lower;
+    check_.passed = aboveLower && (condition.upperOpen ? value < condition.upper : value <= condition.upper);
+    return {};
+  }
+
+  std::string operator()(const RelationCondition& condition) {
+    const JudgedResult* other = nullptr;
+    for (const JudgedResult& one : results_) {
+      if (one.result.name() != condition.other) continue;
+      if (other != nullptr) return formatMessage("several results have the name '%@'", condition.other);
+      other = &one;
+    }
+    if (other == nullptr) return formatMessage("there is no result '%@'", condition.other);
+    const Measurement& measured = other->result.measurement();
+    if (std::string problem = validate(measured.unit().symbol()); !problem.empty()) return problem;
+    if (!std::isfinite(measured.value())) {
+      return formatMessage("the value of %@ is %@", condition.other, measured.value());
+    }
+    check_.passed = holds(condition.comparison, measured_.value(), measured.value(), condition.tolerance);
+    return {};
+  }
+
+ private:
+  std::string validate(const std::optional<std::string>& unit) const {
+    if (unit && *unit != measured_.unit().symbol()) {
+      return formatMessage("the limit is in '%@' but the value is in '%@'", *unit, measured_.unit().symbol());
+    }
+    if (!std::isfinite(measured_.value())) return formatMessage("the value is %@", measured_.value());
+    return {};
+  }
+
+  LimitCheck& check_;
+  const Measurement measured_;
+  const std::vector<JudgedResult>& results_;
+};
+
+LimitCheck compared(const UserLimit& limit, std::size_t index, const std::vector<JudgedResult>& results) {
+  const QZMeasuredResult& result = results[index].result;
+  LimitCheck check{limit, result, index};
+  const std::string why = std::visit(Comparison(check, results), limit.condition);
+  if (!why.empty()) {
+    check.problem = formatMessage("the result %@ cannot be compared with the limit '%@': %@", result.name(),
+                                  canonicalText(limit), why);
+  }
+  return check;
+}
+
+bool fitsAny(const UserLimit& limit, const DiagnosticRecord& record) {
+  return std::any_of(record.measuredResults.begin(), record.measuredResults.end(),
+                     [&limit](const JudgedResult& one) { return matchesName(limit.result, one.result.name()); });
+}
+
+}  // namespace
+
+std::string_view LimitCheck::verdictName() const {
+  if (passed) return nameOf(ResultVerdict::kPass);
+  return counts() && !problem.empty() ? nameOf(ResultVerdict::kError) : nameOf(limit.severity);
+}
+
+bool appliesTo(const UserLimit& limit, const std::string& diagnostic) {
+  return limit.diagnostic.empty() || matchesName(limit.diagnostic, diagnostic);
+}
+
+std::vector<UserLimit> limitsFor(const std::string& diagnostic, const std::vector<UserLimit>& limits) {
+  std::vector<UserLimit> wanted;
+  std::copy_if(limits.begin(), limits.end(), std::back_inserter(wanted),
+               [&diagnostic](const UserLimit& limit) { return appliesTo(limit, diagnostic); });
+  return wanted;
+}
+
+std::vector<LimitCheck> limitChecksOf(const DiagnosticRecord& record) {
+  std::vector<LimitCheck> checks;
+  for (std::size_t i = 0; i < record.measuredResults.size(); ++i) {
+    for (const UserLimit& limit : record.limits) {
+      if (matchesName(limit.result, record.measuredResults[i].result.name())) {
+        checks.push_back(compared(limit, i, record.measuredResults));
+      }
+    }
+  }
+  return checks;
+}
+
+std::vector<LimitCheck> checksOfResult(const std::vector<LimitCheck>& checks, std::size_t index) {
+  std::vector<LimitCheck> wanted;
+  std::copy_if(checks.begin(), checks.end(), std::back_inserter(wanted),
+               [index](const LimitCheck& check) { return check.index == index; });
+  return wanted;
+}
+
+std::optional<QZLimit> boundsOf(const LimitCheck& check) {
+  if (std::holds_alternative<RelationCondition>(check.limit.condition)) return std::nullopt;
+  QZLimit bounds(labelOf(check.limit));
+  const QZUnit& unit = check.result.measurement().unit();
+  const auto bound = [&unit](double value, bool open) {
+    return std::make_shared<const QZBound>(Measurement(value, unit), open);
+  };
+  if (const auto* const interval = std::get_if<IntervalCondition>(&check.limit.condition)) {
+    bounds.setLowerBound(bound(interval->lower, interval->lowerOpen));
+    bounds.setUpperBound(bound(interval->upper, interval->upperOpen));
+    return bounds;
+  }
+  const auto& condition = std::get<NumberCondition>(check.limit.condition);
+  switch (condition.comparison) {
+    case LimitOperator::kLess: bounds.setUpperBound(bound(condition.number, true)); break;
+    case LimitOperator::kLessOrEqual: bounds.setUpperBound(bound(condition.number, false)); break;
+    case LimitOperator::kGreater: bounds.setLowerBound(bound(condition.number, true)); break;
+    case LimitOperator::kGreaterOrEqual: bounds.setLowerBound(bound(condition.number, false)); break;
+    case LimitOperator::kEqual:
+      bounds.setLowerBound(bound(condition.number - condition.tolerance, false));
+      bounds.setUpperBound(bound(condition.number + condition.tolerance, false));
+      break;
+  }
+  return bounds;
+}
+
+std::vector<UserLimit> limitsWithoutResult(const std::vector<UserLimit>& limits,
+                                           const std::vector<DiagnosticRecord>& records) {
+  std::vector<UserLimit> without;
+  for (const UserLimit& limit : limits) {
+    bool isMeant = false;
+    bool isDecided = false;  // it fits, or an error is the reason why it does not
+    for (const DiagnosticRecord& record : records) {
+      if (!appliesTo(limit, record.name) || isOfLimit(record)) continue;
+      isMeant = true;
+      isDecided = isDecided || record.error != nullptr || fitsAny(limit, record);
+    }
+    if (!isDecided && (isMeant || !limit.onlyIfSelected)) without.push_back(limit);
+  }
+  return without;
+}
+
+bool isOfLimit(const DiagnosticRecord& record) {
+  return record.experimentName.empty() && record.error != nullptr && record.error->domain() == QuazorHostErrorDomain &&
+         record.error->code() == static_cast<std::int64_t>(HostErrorCode::kLimitWithoutResult);
+}
+
+DiagnosticErrorPtr errorOfLimitWithoutResult(const UserLimit& limit, const std::vector<DiagnosticRecord>& records) {
+  std::vector<std::string> names;
+  std::vector<std::string> diagnostics;
+  for (const DiagnosticRecord& record : records) {
+    diagnostics.push_back(record.name);
+    if (!appliesTo(limit, record.name)) continue;
+    for (const JudgedResult& one : record.measuredResults) names.push_back(one.result.name());
+  }
+  const bool isMeant = std::any_of(diagnostics.begin(), diagnostics.end(),
+                                   [&limit](const std::string& name) { return appliesTo(limit, name); });
+  std::string why = isMeant ? "no result has the name '" + limit.result + "'" + didYouMean(limit.result, names)
+                            : "no diagnostic of this run has the name '" + limit.diagnostic + "'" +
+                                  didYouMean(limit.diagnostic, diagnostics);
+  return hostError(
+      HostErrorCode::kLimitWithoutResult,
+      formatMessage("the limit '%@' (%@) was compared with nothing: %@", canonicalText(limit), limit.source, why));
+}
+
+}  // namespace quazor

@@ -1,0 +1,59 @@
+// Compares measured results with the limits that the user set.
+#pragma once
+
+#include "contract/results.h"
+#include "host/limits/user_limit.h"
+#include "host/model/judge.h"
+
+#include <cstddef>
+#include <optional>
+#include <string>
+#include <string_view>
+#include <vector>
+
+namespace quazor {
+
+struct DiagnosticRecord;
+
+// The comparison of one result with one limit.
+struct LimitCheck {
+  UserLimit limit;
+  QZMeasuredResult result;
+  std::size_t index = 0;  // of the result, among those of the record
+  bool passed = false;
+  std::string problem{};  // why they cannot be compared; empty if they can
+
+  // False if a failure only causes a warning.
+  bool counts() const { return limit.severity == LimitSeverity::kFail; }
+  // "pass", "fail", "error" if they cannot be compared, or "warn".
+  std::string_view verdictName() const;
+};
+
+// True if the limit is meant for this diagnostic.
+bool appliesTo(const UserLimit& limit, const std::string& diagnostic);
+
+// The limits for this diagnostic.
+std::vector<UserLimit> limitsFor(const std::string& diagnostic, const std::vector<UserLimit>& limits);
+
+// Compares every result of the record with every one of its limits that fits it by name, in the order of the results.
+std::vector<LimitCheck> limitChecksOf(const DiagnosticRecord& record);
+
+// Those of `checks` that compare the result at `index`.
+std::vector<LimitCheck> checksOfResult(const std::vector<LimitCheck>& checks, std::size_t index);
+
+// The limit as plain bounds in the unit of the result, with labelOf() as its name; nothing for a relation.
+std::optional<QZLimit> boundsOf(const LimitCheck& check);
+
+// The limits that fit no result in any of the records, although a diagnostic for which they are meant ended without an
+// error. A limit that is only meant for some diagnostics, none of which was selected, is not one of them if it comes
+// from a profile.
+std::vector<UserLimit> limitsWithoutResult(const std::vector<UserLimit>& limits,
+                                           const std::vector<DiagnosticRecord>& records);
+
+// True for the entry that reports a limit without a result: it is no diagnostic.
+bool isOfLimit(const DiagnosticRecord& record);
+
+// The error of a limit without a result, with the reason.
+DiagnosticErrorPtr errorOfLimitWithoutResult(const UserLimit& limit, const std::vector<DiagnosticRecord>& records);
+
+}  // namespace quazor

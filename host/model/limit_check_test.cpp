@@ -1,0 +1,216 @@
+#include "host/model/limit_check.h"
+
+#include "host/error/host_error.h"
+#include "host/model/diagnostic_record.h"
+#include "host/model/judge.h"
+
+#include <gmock/gmock.h>
+#include <gtest/gtest.h>
+
+#include <limits>
+#include <random>
+#include <string>
+#include <string_view>
+#include <vector>
+
+namespace quazor {
+namespace {
+
+QZMeasuredResult measured(std::string_view name, double value, std::string_view unit = "frames") {
+  return {name, Measurement(value, QZUnit::unitWithSymbol(unit))};
+}
+
+UserLimit limitFrom(std::string_view text, LimitSeverity severity = LimitSeverity::kFail) {
+  UserLimit limit = parseUserLimit(text);
+  limit.severity = severity;
+  limit.source = "command line";
+  return limit;
+}
+
+DiagnosticRecord limitedRecord(std::vector<QZMeasuredResult> results, const std::vector<UserLimit>& limits) {
+  DiagnosticRecord record;
+  record.name = "Cameras.Back";
+  record.experimentName = "CamerasExperiment";
+  record.limits = limitsFor(record.name, limits);
+  for (QZMeasuredResult& one : results) record.measuredResults.push_back(judgeResult(std::move(one)));
+  return record;
+}
+
+TEST(LimitCheck, ComparesAResultWithANumber) {
+  struct Row {
+    const char* limit;
+    double value;
+    bool passed;
+  };
+  constexpr Row kRows[] = {
+      {"A < 5", 4.9, true},
+      {"A < 5", 5, false},
+      {"A <= 5", 5, true},
+      {"A <= 5", 5.1, false},
+      {"A > 5", 5.1, true},
+      {"A > 5", 5, false},
+      {"A >= 5", 5, true},
+      {"A >= 5", 4.9, false},
+      {"A == 5", 5, true},
+      {"A == 5", 5.0000001, false},
+      {"A == 5 +- 0.5", 5.5, true},
+      {"A == 5 +- 0.5", 4.5, true},
+      {"A == 5 +- 0.5", 5.51, false},
+      {"A == 5 +- 0.5", 4.49, false},
+      {"A in [1, 2]", 1, true},
+      {"A in [1, 2]", 2, true},
+      {"A in (1, 2)", 1, false},
+      {"A in (1, 2)", 2, false},
+      {"A in (1, 2)", 1.5, true},
+      {"A in [1, 2]", 0.9, false},
+      {"A in [1, 2]", 2.1, false},
+      {"A >= 5 frames", 5, true},
+      {"A in [1, 2] frames", 3, false},
+  };
+  for (const Row& row : kRows) {
+    const std::vector<LimitCheck> checks =
+        limitChecksOf(limitedRecord({measured("A", row.value)}, {limitFrom(row.limit)}));
+    ASSERT_EQ(checks.size(), 1U) << row.limit;
+    EXPECT_EQ(checks[0].passed, row.passed) << row.limit << ' ' << row.value;
+    EXPECT_EQ(checks[0].problem, "") << row.limit;
+  }
+}
+
+TEST(LimitCheck, ComparesTwoResults) {
+  const std::vector<QZMeasuredResult> results = {measured("A", 5), measured("B", 6)};
+  const auto passes = [&results](const char* text) {
+    return limitChecksOf(limitedRecord(results, {limitFrom(text)})).at(0).passed;
+  };
+  EXPECT_TRUE(passes("A < B"));
+  EXPECT_FALSE(passes("B < A"));
+  EXPECT_FALSE(passes("A == B"));
+  EXPECT_TRUE(passes("A == B +- 1"));
+  EXPECT_TRUE(passes("B == A +- 1"));
+}
+
+TEST(LimitCheck, SaysWhyAComparisonIsImpossible) {
+  constexpr double kNan = std::numeric_limits<double>::quiet_NaN();
+  struct Row {
+    const char* limit;
+    const char* why;
+  };
+  constexpr Row kRows[] = {
+      {"A > 5 ms", "the limit is in 'ms' but the value is in 'frames'"},
+      {"A in [1, 2] ms", "the limit is in 'ms' but the value is in 'frames'"},
+      {"A > T", "the limit is in 'ms' but the value is in 'frames'"},
+      {"A > C", "there is no result 'C'"},
+      {"A > Twice", "several results have the name 'Twice'"},
+      {"A > N", "the value of N is nan"},
+      {"N > 1", "the value is nan"},
+      {"N in [1, 2]", "the value is nan"},
+      {"N > A", "the value is nan"},
+  };
+  for (const Row& row : kRows) {
+    const DiagnosticRecord record = limitedRecord(
+        {measured("A", 5), measured("N", kNan), measured("T", 1, "ms"), measured("Twice", 1), measured("Twice", 2)},
+        {limitFrom(row.limit)});
+    const std::vector<LimitCheck> checks = limitChecksOf(record);
+    ASSERT_EQ(checks.size(), 1U) << row.limit;
+    EXPECT_EQ(checks[0].problem, "the result " + checks[0].result.name() + " cannot be compared with the limit '" +
+                                     canonicalText(checks[0].limit) + "': " + row.why);
+    EXPECT_FALSE(checks[0].passed);
+    const RecordJudgement judged = judgeRecord(record, true);
+    EXPECT_EQ(judged.verdict, Verdict::kError);
+    EXPECT_EQ(judged.error->code(), static_cast<std::int64_t>(HostErrorCode::kCannotBeJudged));
+    EXPECT_EQ(judged.error->localizedDescription(), checks[0].problem);
+  }
+}
+
+TEST(LimitCheck, TakesPatternsInTheOrderOfTheResults) {
+  const DiagnosticRecord record =
+      limitedRecord({measured("B.Total", 2), measured("A.Total", 1), measured("A.Rest", 0)},
+                    {limitFrom("*.Total >= 2"), limitFrom("Cameras.*:A.* >= 0"), limitFrom("Projector:* >= 9")});
+  std::vector<std::string> seen;
+  for (const LimitCheck& one : limitChecksOf(record)) {
+    seen.push_back(one.result.name() + " " + conditionText(one.limit) + (one.passed ? " pass" : " fail"));
+  }
+  EXPECT_THAT(seen,
+              testing::ElementsAre("B.Total >= 2 pass", "A.Total >= 2 fail", "A.Total >= 0 pass", "A.Rest >= 0 pass"));
+}
+
+TEST(LimitCheck, DecidesTheVerdictUnlessItOnlyWarns) {
+  const auto verdict = [](const std::vector<UserLimit>& limits) {
+    return judgeRecord(limitedRecord({measured("A", 1)}, limits), true).verdict;
+  };
+  EXPECT_EQ(verdict({limitFrom("A >= 1")}), Verdict::kPass);
+  EXPECT_EQ(verdict({limitFrom("A >= 2")}), Verdict::kFail);
+  EXPECT_EQ(verdict({limitFrom("A >= 2", LimitSeverity::kWarn)}), Verdict::kPass);
+  EXPECT_EQ(verdict({limitFrom("A >= 2 ms", LimitSeverity::kWarn)}), Verdict::kPass);
+  EXPECT_EQ(verdict({limitFrom("A >= 2"), limitFrom("A >= 2 ms")}), Verdict::kError);
+}
+
+int severityRank(Verdict verdict) {
+  if (verdict == Verdict::kPass) return 0;
+  return verdict == Verdict::kFail ? 1 : 2;
+}
+
+// Whatever the limits, a verdict is never better than without them.
+TEST(LimitCheck, OnlyMakesVerdictsStricter) {
+  std::mt19937 random(7);
+  constexpr const char* kLimits[] = {"A >= 3", "B < 3 ms", "* == 2 +- 1", "A > B", "B == C", "D > 1", "A in [0, 9]"};
+  for (int i = 0; i < 2'000; ++i) {
+    std::vector<QZMeasuredResult> results;
+    for (const char* name : {"A", "B", "C"}) {
+      if (random() % 4 == 0) continue;
+      QZMeasuredResult result = measured(
+          name, random() % 8 == 0 ? std::numeric_limits<double>::infinity() : static_cast<double>(random() % 6));
+      if (random() % 2 == 0) {
+        QZLimit limit("own");
+        limit.setLowerBound(std::make_shared<QZBound>(
+            Measurement(static_cast<double>(random() % 6), QZUnit::unitWithSymbol("frames")), false));
+        result.setLimit(std::move(limit));
+      }
+      results.push_back(std::move(result));
+    }
+    std::vector<UserLimit> limits;
+    for (const char* text : kLimits) {
+      if (random() % 2 == 0) {
+        limits.push_back(limitFrom(text, random() % 2 == 0 ? LimitSeverity::kFail : LimitSeverity::kWarn));
+      }
+    }
+    DiagnosticRecord record = limitedRecord(results, limits);
+    const Verdict with = judgeRecord(record, true).verdict;
+    record.limits.clear();
+    const Verdict without = judgeRecord(record, true).verdict;
+    ASSERT_GE(severityRank(with), severityRank(without)) << i;
+  }
+}
+
+TEST(LimitWithoutResult, IsFoundAmongAllDiagnostics) {
+  DiagnosticRecord passed = limitedRecord({measured("A", 1)}, {});
+  DiagnosticRecord failed;
+  failed.name = "Projector";
+  failed.error = hostError(HostErrorCode::kCrashed, "it crashed");
+  const auto without = [](const char* text, bool onlyIfSelected, const std::vector<DiagnosticRecord>& records) {
+    UserLimit limit = limitFrom(text);
+    limit.onlyIfSelected = onlyIfSelected;
+    return !limitsWithoutResult({limit}, records).empty();
+  };
+  EXPECT_FALSE(without("A > 0", false, {passed}));
+  EXPECT_FALSE(without("Cameras.*:A > 0", true, {passed}));
+  EXPECT_TRUE(without("X > 0", false, {passed}));
+  EXPECT_TRUE(without("Cameras.*:X > 0", true, {passed}));
+  EXPECT_TRUE(without("Projector:X > 0", false, {passed}));
+  EXPECT_FALSE(without("Projector:X > 0", true, {passed}));          // not selected
+  EXPECT_FALSE(without("Projector:X > 0", true, {passed, failed}));  // its diagnostic has no results
+  EXPECT_FALSE(without("X > 0", false, {passed, failed}));
+  EXPECT_TRUE(without("X > 0", false, {}));
+}
+
+TEST(LimitWithoutResult, HasAnErrorThatNamesWhatIsNear) {
+  const std::vector<DiagnosticRecord> records = {limitedRecord({measured("BackTele.Total", 1)}, {})};
+  EXPECT_EQ(errorOfLimitWithoutResult(limitFrom("BackTele.Totl > 0"), records)->localizedDescription(),
+            "the limit 'BackTele.Totl > 0' (command line) was compared with nothing: no result has the name "
+            "'BackTele.Totl'; did you mean 'BackTele.Total'?");
+  EXPECT_EQ(errorOfLimitWithoutResult(limitFrom("Cameras.Bakc:A > 0"), records)->localizedDescription(),
+            "the limit 'Cameras.Bakc:A > 0' (command line) was compared with nothing: no diagnostic of this run has "
+            "the name 'Cameras.Bakc'; did you mean 'Cameras.Back'?");
+}
+
+}  // namespace
+}  // namespace quazor
