@@ -2,6 +2,7 @@
 
 #include "base/text/nearest_name.h"
 #include "contract/contract.h"
+#include "host/cli/help_texts.h"
 #include "host/cli/option_values.h"
 #include "host/device/phone.h"
 #include "host/text/table.h"
@@ -17,34 +18,6 @@
 namespace quazor {
 
 namespace {
-
-constexpr const char* kExamples = R"(Examples:
-  quazor list                                     list the installed diagnostics and experiments
-  quazor describe 'CameraSync*'                   what these diagnostics do, and their parameters
-  quazor run --all                                run every diagnostic on the healthy simulated phone
-  quazor run CameraSyncDiagnostic.Back --set duration=10
-  quazor run --all --phone my_phone.json --format json --output report.json
-  quazor phone probe                              find this machine's devices and print a starter binding
-  quazor run --all --phone linux:board.json       run on this machine's own cameras, sensors and counters
-  quazor run --all --record run.jsonl --output junit:report.xml --output ocp:report.jsonl
-  quazor run --only failed                        rerun the diagnostics that did not pass last time
-  quazor experiment CameraSyncExperiment.Back     measure without judging
-  quazor verify run.jsonl                         check that the recorded verdicts follow from the data
-  quazor analyze run.jsonl --set analysis.frameCount=60
-  quazor explain QZCapturePlugInErrorDomain:206   what an error means, and what to do next
-  quazor selftest                                 check that the diagnostics detect simulated faults
-)";
-
-constexpr const char* kExitCodes = R"(Exit codes:
-  0    all diagnostics passed, or all experiments returned a result
-  1    a result was outside its limits, or verify, diff or selftest found a problem
-  2    a diagnostic or experiment ended in an error
-  3    verify: a record is incomplete, because its run did not end
-  64   the command line is invalid
-  66   a plug-in, scenario, binding, profile or record cannot be read or loaded
-  70   quazor itself failed
-  73   a report or record cannot be written
-  130  interrupted)";
 
 // Default memory limit of a plug-in process: more than any diagnostic needs, less than a bench machine has.
 constexpr std::uint64_t kMebibyte = std::uint64_t{1024} * 1024;
@@ -427,12 +400,13 @@ void declareOtherCommands(CLI::App& app, RawOptions& raw) {
 
 void declareCommands(CLI::App& app, RawOptions& raw) {
   app.require_subcommand(1);
-  app.footer(std::string(kExamples) + "\n" + kExitCodes);
+  app.footer(helpFooter());
   app.set_version_flag("--version",
                        "quazor " QUAZOR_VERSION ", plug-in contract " + std::to_string(QUAZOR_CONTRACT_VERSION));
   declareLookingCommands(app, raw);
   declareRunningCommands(app, raw);
   declareOtherCommands(app, raw);
+  for (CLI::App* const command : app.get_subcommands({})) command->footer(helpFooter(command->get_name()));
 }
 
 }  // namespace

@@ -271,6 +271,32 @@ TEST(ParseCommandLine, AnswersForHelpAndVersion) {
   EXPECT_THAT(version.out, testing::StartsWith("quazor "));
 }
 
+// The lines of the text that begin with that prefix, without it.
+std::vector<std::string> linesAfter(const std::string& prefix, const std::string& text) {
+  std::istringstream lines(text);
+  std::vector<std::string> found;
+  for (std::string line; std::getline(lines, line);) {
+    if (line.starts_with(prefix)) found.push_back(line.substr(prefix.size()));
+  }
+  return found;
+}
+
+TEST(Help, OfACommandHasItsOwnExamplesAndExitCodes) {
+  std::size_t examples = 0;
+  for (const std::string_view name : kCommandNames) {
+    const std::string help = parse({std::string(name), "--help"}).out;
+    for (const std::string& example : linesAfter("  quazor ", help)) {
+      EXPECT_TRUE(example == name || example.starts_with(std::string(name) + " ")) << name << ": " << example;
+      ++examples;
+    }
+    EXPECT_THAT(help, HasSubstr("\nExit codes:\n  0    ")) << name;
+    EXPECT_THAT(help, HasSubstr("\n  64   the command line is invalid\n")) << name;
+    EXPECT_EQ(linesAfter("  3    ", help).size(), name == "verify" ? 1U : 0U) << name;
+    EXPECT_THAT(linesAfter("  0    ", help), testing::SizeIs(1)) << name;
+  }
+  EXPECT_EQ(examples, linesAfter("  quazor ", parse({"--help"}).out).size());
+}
+
 TEST(ParseCommandLine, HelpsWhenCalledWithNothing) {
   const Parsed parsed = parse({});
   EXPECT_FALSE(parsed.options);

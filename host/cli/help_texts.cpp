@@ -1,0 +1,121 @@
+#include "host/cli/help_texts.h"
+
+#include <algorithm>
+#include <cstddef>
+
+namespace quazor {
+
+namespace {
+
+// The width of a short example and two spaces, so that explanations form a column.
+constexpr std::size_t kColumn = 48;
+
+struct Example {
+  std::string_view line;
+  std::string_view meaning{};
+};
+
+constexpr Example kExamples[] = {
+    {"quazor list", "list the installed diagnostics and experiments"},
+    {"quazor describe 'CameraSync*'", "what these diagnostics do, and their parameters"},
+    {"quazor run --all", "run every diagnostic on the healthy simulated phone"},
+    {"quazor run CameraSyncDiagnostic.Back --set duration=10"},
+    {"quazor run --all --phone my_phone.json --format json --output report.json"},
+    {"quazor phone probe", "find this machine's devices and print a starter binding"},
+    {"quazor run --all --phone linux:board.json", "run on this machine's own cameras, sensors and counters"},
+    {"quazor run --all --limit '*.Total >= 90'", "also judge by a limit of your own"},
+    {"quazor run --all --record run.jsonl --tag serial=C02X --output junit:report.xml"},
+    {"quazor run --only failed", "rerun the diagnostics that did not pass last time"},
+    {"quazor experiment CameraSyncExperiment.Back", "measure without judging"},
+    {"quazor verify run.jsonl", "check that the recorded verdicts follow from the data"},
+    {"quazor analyze run.jsonl --set analysis.frameCount=60"},
+    {"quazor diff before.jsonl after.jsonl", "show what differs between two records"},
+    {"quazor explain QZCapturePlugInErrorDomain:206", "what an error means, and what to do next"},
+    {"quazor doctor", "check the installation"},
+    {"quazor selftest", "check that the diagnostics detect simulated faults"},
+    {"quazor completion bash > ~/.local/share/bash-completion/completions/quazor"},
+};
+
+struct ExitCodeHelp {
+  int code;
+  std::string_view meaning;
+  std::string_view commands;  // separated by spaces; empty: all
+};
+
+constexpr ExitCodeHelp kExitCodes[] = {
+    {0, "all diagnostics passed, or all experiments returned a result", "run experiment analyze"},
+    {0, "no problem was found", "verify diff doctor selftest"},
+    {0, "done", "list describe explain phone completion"},
+    {1, "a result was outside its limits", "run analyze"},
+    {1, "a problem was found", "verify diff selftest"},
+    {2, "a diagnostic or experiment ended in an error", "run experiment analyze describe"},
+    {3, "a record is incomplete, because its run did not end", "verify"},
+    {64, "the command line is invalid", {}},
+    {66, "a plug-in, scenario, binding, profile or record cannot be read or loaded",
+     "list describe run experiment verify analyze diff explain doctor selftest"},
+    {70, "quazor itself failed", {}},
+    {73, "a report or record cannot be written", {}},
+    {130, "interrupted", "list describe run experiment analyze doctor selftest"},
+};
+
+bool hasWord(std::string_view words, std::string_view word) {
+  for (std::size_t begin = 0; begin < words.size();) {
+    const std::size_t end = std::min(words.find(' ', begin), words.size());
+    if (words.substr(begin, end - begin) == word) return true;
+    begin = end + 1;
+  }
+  return false;
+}
+
+std::string exampleText(const Example& example) {
+  std::string text = "  " + std::string(example.line);
+  if (!example.meaning.empty()) {
+    text.append(text.size() < kColumn + 2 ? kColumn + 2 - text.size() : 2, ' ');
+    text += example.meaning;
+  }
+  return text + "\n";
+}
+
+std::string codeText(int code, std::string_view meaning) {
+  std::string text = "  " + std::to_string(code);
+  text.append(7 - text.size(), ' ');
+  text += meaning;
+  return text + "\n";
+}
+
+std::string footerOf(const std::string& examples, const std::string& codes) {
+  std::string footer = (examples.empty() ? "" : "Examples:\n" + examples + "\n") + "Exit codes:\n" + codes;
+  footer.pop_back();  // the help adds a line end
+  return footer;
+}
+
+}  // namespace
+
+std::string helpFooter() {
+  std::string examples;
+  for (const Example& one : kExamples) examples += exampleText(one);
+  std::string codes;
+  const auto add = [&codes](int code, std::string_view meaning) { codes += codeText(code, meaning); };
+  add(0, "all diagnostics passed, or all experiments returned a result");
+  add(1, "a result was outside its limits, or verify, diff or selftest found a problem");
+  for (const ExitCodeHelp& one : kExitCodes) {
+    if (one.code < 2) continue;
+    add(one.code, one.code == 3 ? "verify: a record is incomplete, because its run did not end" : one.meaning);
+  }
+  return footerOf(examples, codes);
+}
+
+std::string helpFooter(std::string_view command) {
+  const std::string word = "quazor " + std::string(command);
+  std::string examples;
+  for (const Example& one : kExamples) {
+    if (one.line == word || one.line.starts_with(word + " ")) examples += exampleText(one);
+  }
+  std::string codes;
+  for (const ExitCodeHelp& one : kExitCodes) {
+    if (one.commands.empty() || hasWord(one.commands, command)) codes += codeText(one.code, one.meaning);
+  }
+  return footerOf(examples, codes);
+}
+
+}  // namespace quazor
