@@ -168,10 +168,12 @@ class OutcomesTest(unittest.TestCase):
 class FakeLaboratory:
     """Builds and passes as it is told while a mutant is applied, and remembers those steps."""
 
-    def __init__(self, builds=True, failing=None, sound=True):
+    def __init__(self, builds=True, failing=None, sound=True, reason="Failed", times=100):
         self.builds = builds
         self.failing = failing
         self.sound = sound
+        self.reason = reason
+        self.times = times  # how often the test fails
         self.is_mutated = False
         self.steps = []
 
@@ -190,7 +192,10 @@ class FakeLaboratory:
         if not self.is_mutated:
             return self.sound, ""
         self.steps.append(("test", pattern))
-        return pattern != self.failing, "The following tests FAILED:\n\t  3 - b_test (Timeout)\n"
+        if pattern not in (self.failing, "^(b_test)$") or self.times == 0:
+            return True, ""
+        self.times -= 1
+        return False, f"The following tests FAILED:\n\t  3 - b_test ({self.reason})\n"
 
 
 class JudgeTest(unittest.TestCase):
@@ -209,8 +214,28 @@ class JudgeTest(unittest.TestCase):
 
     def test_the_first_failure_kills(self):
         laboratory = FakeLaboratory(failing="^(a_test)$")
+        self.assertEqual(self.judge(laboratory), ("killed", "b_test (Failed)"))
+        self.assertEqual(laboratory.steps, [("make", ("a_test",)), ("test", "^(a_test)$"), ("test", "^(b_test)$")])
+
+    def test_a_test_that_fails_once_does_not_kill(self):
+        self.assertEqual(self.judge(FakeLaboratory(failing="^(a_test)$", times=1)), ("survived", ""))
+
+    def test_tests_that_fail_now_and_then_decide_nothing(self):
+        laboratory = FakeLaboratory(failing="^(a_test)$")
+        laboratory.test = lambda pattern, each, limit: (pattern != "^(a_test)$" or not laboratory.is_mutated,
+                                                        "\t  3 - b_test (Failed)\n")
+        with self.assertRaises(run.BaselineError):
+            self.judge(laboratory)
+
+    def test_a_timeout_kills_unless_the_machine_is_busy(self):
+        laboratory = FakeLaboratory(failing="^(a_test)$", reason="Timeout")
         self.assertEqual(self.judge(laboratory), ("killed", "b_test (Timeout)"))
-        self.assertEqual(len(laboratory.steps), 2)
+        laboratory = FakeLaboratory(failing="^(a_test)$", reason="Timeout")
+        idle = laboratory.test
+        laboratory.test = lambda pattern, each, limit: (
+            (False, "") if pattern == "^(b_test)$" and not laboratory.is_mutated else idle(pattern, each, limit))
+        with self.assertRaises(run.BaselineError):
+            self.judge(laboratory)
 
     def test_some_of_the_steps_do_not_decide_about_a_survivor(self):
         self.assertEqual(self.judge(FakeLaboratory(), 0, 1), (run.OPEN, ""))
