@@ -120,7 +120,7 @@ std::chrono::nanoseconds nanosecondsAt(const Json& json, const char* key) {
 
 Json jsonOf(const RunStarted& event) {
   return {{"event", "runBegan"},
-          {"program", event.program},
+          {"program", losslessText(event.program)},
           {"contract", event.contract},
           {"date", timestampText(event.date)},
           {"plugins", textsJson(event.plugins)},

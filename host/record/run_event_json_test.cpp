@@ -70,6 +70,13 @@ std::vector<EventRow> rows() {
   };
 }
 
+TEST(EventJson, KeepsAProgramThatIsNotValidUtf8) {
+  RunStarted run = runOf({});
+  run.program = "0.1.0\xff";
+  const RunEvent again = back(run);
+  EXPECT_EQ(std::get<RunStarted>(again).program, run.program);
+}
+
 TEST(EventJson, HasAFormForEveryEvent) {
   std::set<std::size_t> kinds;
   for (const EventRow& row : rows()) {

@@ -30,7 +30,7 @@ void requireCamera(const CameraBinding& camera) {
     require(std::has_single_bit(field.bytes) && field.bytes <= 8, "a field has the size of an integer");
     require(field.shift < field.bytes * 8, "a shift leaves some bits");
     const std::uint32_t bits = field.bytes * 8 - field.shift;
-    require(!field.mask || (*field.mask != 0 && std::bit_width(*field.mask) <= static_cast<int>(bits)),
+    require(!field.mask || (*field.mask != 0 && static_cast<std::uint32_t>(std::bit_width(*field.mask)) <= bits),
             "a mask selects bits that are there");
   }
   if (camera.projector) {

@@ -20,8 +20,11 @@ namespace {
 
 using Texts = std::vector<std::string>;
 
+// The text is an argument, or the value in one of the form --OPTION=VALUE. Options that are not given are empty.
 bool isGiven(const std::string& text, const Texts& arguments) {
-  return std::ranges::any_of(arguments, [&](const std::string& one) { return one.ends_with(text); });
+  return text.empty() || std::ranges::any_of(arguments, [&](const std::string& one) {
+           return one == text || (one.starts_with("--") && one.substr(one.find('=') + 1) == text);
+         });
 }
 
 void requireGiven(const Texts& texts, const Texts& arguments) {
@@ -166,6 +169,8 @@ extern "C" int LLVMFuzzerTestOneInput(const std::uint8_t* data, std::size_t size
   const std::optional<Options> options = parseCommandLine(arguments, out, err, &code);
   requirePrintable(out.str());
   requirePrintable(err.str());
+  require(err.str().find("\\x01") == std::string::npos || asText(data, size).find('\x01') != std::string_view::npos,
+          "a refusal quotes what was given");
   if (options) {
     require(code == ExitCode::kAllPassed && out.str().empty() && err.str().empty(), "accepting prints nothing");
     requireOptions(*options, arguments);
