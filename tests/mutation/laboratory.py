@@ -3,12 +3,14 @@
 import contextlib
 import os
 import pathlib
+import re
 import resource
 import shutil
 import signal
 import subprocess
 import time
 
+LISTED_TEST = re.compile(r"^ +Test +#\d+: (\S+)", re.MULTILINE)
 MEMORY = 16 << 30  # a mutant may allocate without end
 FILE_SIZE = 2 << 30
 # Checks of texts of the tree, and tests that take long for what they could detect here.
@@ -68,7 +70,7 @@ class Laboratory:
     def known_tests(self):
         """The names of all tests, whether built or not."""
         listed = subprocess.run(["ctest", "--test-dir", str(self.build), "-N"], capture_output=True, text=True, check=True)
-        return {line.split(": ", 1)[1] for line in listed.stdout.splitlines() if line.strip().startswith("Test ")}
+        return set(LISTED_TEST.findall(listed.stdout))
 
     def targets(self):
         listed = subprocess.run(["ninja", "-C", str(self.build), "-t", "targets", "all"], capture_output=True, text=True,

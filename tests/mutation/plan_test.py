@@ -8,6 +8,7 @@ import tempfile
 import types
 import unittest
 
+import laboratory
 import plan
 import run
 from mutants import Mutant, mutants_of
@@ -198,50 +199,60 @@ class FakeLaboratory:
         return False, f"The following tests FAILED:\n\t  3 - b_test ({self.reason})\n"
 
 
+class OutputTest(unittest.TestCase):
+    def test_the_names_of_tests_are_read_from_a_list(self):
+        listed = "Test project /a: b\n  Test  #1: one_test\n  Test #10: two.test (Disabled)\n\nTotal Tests: 2\n"
+        self.assertEqual(laboratory.LISTED_TEST.findall(listed), ["one_test", "two.test"])
+
+    def test_the_names_of_failed_tests_are_read_from_a_summary(self):
+        summary = "The following tests FAILED:\n\t  1 - one_test (Failed)\n\t 12 - two_test (Timeout)\nErrors while\n"
+        self.assertEqual(run.FAILED_TEST.findall(summary), [("one_test", "Failed"), ("two_test", "Timeout")])
+
+
 class JudgeTest(unittest.TestCase):
     FOLDER = plan.Folder("x", (), ("a_test",), ("b_test", "script_test"))
     MUTANT = Mutant("a.cpp", "constant", 0, 1, "2", "1", "2")
 
-    def judge(self, laboratory, first=0, count=run.STEPS):
+    def judge(self, fake, first=0, count=run.STEPS):
         tests, targets = {"a_test", "b_test", "script_test"}, {"a_test", "b_test"}
-        return run.Judge(laboratory, tests, targets).judge(self.FOLDER, self.MUTANT, first, count)
+        return run.Judge(fake, tests, targets).judge(self.FOLDER, self.MUTANT, first, count)
 
     def test_a_survivor_passes_every_step(self):
-        laboratory = FakeLaboratory()
-        self.assertEqual(self.judge(laboratory), ("survived", ""))
-        self.assertEqual(laboratory.steps, [("make", ("a_test",)), ("test", "^(a_test)$"), ("make", ()),
+        fake = FakeLaboratory()
+        self.assertEqual(self.judge(fake), ("survived", ""))
+        self.assertEqual(fake.steps, [("make", ("a_test",)), ("test", "^(a_test)$"), ("make", ()),
                                             ("test", "^(b_test|script_test)$"), ("make", ()), ("test", "")])
 
     def test_the_first_failure_kills(self):
-        laboratory = FakeLaboratory(failing="^(a_test)$")
-        self.assertEqual(self.judge(laboratory), ("killed", "b_test (Failed)"))
-        self.assertEqual(laboratory.steps, [("make", ("a_test",)), ("test", "^(a_test)$"), ("test", "^(b_test)$")])
+        fake = FakeLaboratory(failing="^(a_test)$")
+        self.assertEqual(self.judge(fake), ("killed", "b_test (Failed)"))
+        self.assertEqual(fake.steps, [("make", ("a_test",)), ("test", "^(a_test)$"), ("test", "^(b_test)$")])
 
     def test_a_test_that_fails_once_does_not_kill(self):
         self.assertEqual(self.judge(FakeLaboratory(failing="^(a_test)$", times=1)), ("survived", ""))
 
     def test_tests_that_fail_now_and_then_decide_nothing(self):
-        laboratory = FakeLaboratory(failing="^(a_test)$")
-        laboratory.test = lambda pattern, each, limit: (pattern != "^(a_test)$" or not laboratory.is_mutated,
+        fake = FakeLaboratory(failing="^(a_test)$")
+        fake.test = lambda pattern, each, limit: (pattern != "^(a_test)$" or not fake.is_mutated,
                                                         "\t  3 - b_test (Failed)\n")
         with self.assertRaises(run.BaselineError):
-            self.judge(laboratory)
+            self.judge(fake)
 
     def test_a_timeout_kills_unless_the_machine_is_busy(self):
-        laboratory = FakeLaboratory(failing="^(a_test)$", reason="Timeout")
-        self.assertEqual(self.judge(laboratory), ("killed", "b_test (Timeout)"))
-        laboratory = FakeLaboratory(failing="^(a_test)$", reason="Timeout")
-        idle = laboratory.test
-        laboratory.test = lambda pattern, each, limit: (
-            (False, "") if pattern == "^(b_test)$" and not laboratory.is_mutated else idle(pattern, each, limit))
+        fake = FakeLaboratory(failing="^(a_test)$", reason="Timeout")
+        self.assertEqual(self.judge(fake), ("killed", "b_test (Timeout)"))
+        fake = FakeLaboratory(failing="^(a_test)$", reason="Timeout")
+        idle = fake.test
+        fake.test = lambda pattern, each, limit: (
+            (False, "") if pattern == "^(b_test)$" and not fake.is_mutated else idle(pattern, each, limit))
         with self.assertRaises(run.BaselineError):
-            self.judge(laboratory)
+            self.judge(fake)
 
     def test_some_of_the_steps_do_not_decide_about_a_survivor(self):
         self.assertEqual(self.judge(FakeLaboratory(), 0, 1), (run.OPEN, ""))
-        laboratory = FakeLaboratory()
-        self.assertEqual(self.judge(laboratory, 1, 2), ("survived", ""))
-        self.assertEqual(len(laboratory.steps), 4)
+        fake = FakeLaboratory()
+        self.assertEqual(self.judge(fake, 1, 2), ("survived", ""))
+        self.assertEqual(len(fake.steps), 4)
 
     def test_what_does_not_compile_is_not_killed(self):
         self.assertEqual(self.judge(FakeLaboratory(builds=False)), ("does not compile", ""))
