@@ -254,7 +254,9 @@ Json jsonOf(const FaultsCounted& event) {
 RunEvent readFaultsCounted(const Json& json) {
   FaultsCounted event;
   for (const Json& one : arrayAt(json, "faults")) {
-    event.faults.push_back({memberOf(one, "fault"), get<std::uint64_t>(one, "fired")});
+    const Json& fault = memberOf(one, "fault");
+    if (!fault.is_object()) throw InputError("\"fault\" is not an object");
+    event.faults.push_back({fault, get<std::uint64_t>(one, "fired")});
   }
   return event;
 }

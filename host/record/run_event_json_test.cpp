@@ -210,6 +210,7 @@ TEST(EventFrom, SaysWhatIsWrong) {
       {R"({"event":"measured","measurements":[["R"]]})", "expected a measurement: a name and a value"},
       {R"({"event":"measured","measurements":["R"]})", "expected a measurement: a name and a value"},
       {R"({"event":"faultsCounted","faults":[{"fired":1}]})", "\"fault\" is missing"},
+      {R"({"event":"faultsCounted","faults":[{"fault":7,"fired":1}]})", "\"fault\" is not an object"},
       {R"({"event":"faultsCounted","faults":[{"fault":{},"fired":-1}]})", "\"fired\" has the wrong type"},
   };
   for (const auto& row : kRows)
