@@ -125,7 +125,8 @@ class Mutation:
 
     def _change_number(self, place, token):
         parts = NUMBER.match(token.text) if token.kind == "number" else None
-        if parts is None:
+        pure = self._text_at(place - 1) == "=" and self._text_at(place - 2) in (")", "const", "noexcept")
+        if parts is None or pure:  # a function without a body
             return
         digits = (parts["hex_digits"] or parts["decimal"]).replace("'", "")
         for difference in (1, -1):

@@ -102,6 +102,9 @@ class OperatorsTest(unittest.TestCase):
         self.assertEqual(sorted(results("g(1.5);", "constant")), ["g(0.5);", "g(2.5);"])
         self.assertEqual(results("g(x1);", "constant"), [])
 
+    def test_a_function_without_a_body_stays_one(self):
+        self.assertEqual(mutants_of("a.h", "struct A {\n  virtual int f() const = 0;\n};\n"), [])
+
     def test_texts_change(self):
         self.assertEqual(results('g("a\\"b");', "string"), ['g("a\\"b~");'])
         self.assertEqual(results("g('a');", "string"), [])

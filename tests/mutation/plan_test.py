@@ -116,6 +116,15 @@ class OutcomesTest(unittest.TestCase):
         self.assertEqual(judge.judged, [one.key for one in self.drawn["contract"][:7]])
         self.assertEqual(self.table(7)[0], 0)
 
+    def test_folders_take_turns_in_batches(self):
+        other = plan.FOLDERS[1]
+        self.drawn[other.name] = plan.drawn("1", mutants_of("b.cpp", BODY))
+        judge = FakeJudge(lambda _: "killed")
+        options = types.SimpleNamespace(retry=False, own=False, minutes=None)
+        with contextlib.redirect_stdout(io.StringIO()):
+            run.test_mutants(judge, plan.FOLDERS[:2], self.drawn, {"contract": 15, other.name: 12}, self.outcomes(), options)
+        self.assertEqual("".join(key[0] for key in judge.judged), "a" * 10 + "b" * 10 + "a" * 5 + "b" * 2)
+
     def test_goes_on_where_an_earlier_call_ended(self):
         self.perform(FakeJudge(lambda _: "killed"), 3)
         judge = FakeJudge(lambda _: "killed")

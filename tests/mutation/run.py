@@ -33,6 +33,7 @@ LEAST, LEAST_OF_FOLDER = 0.97, 0.95
 OWN_LIMIT, REST_LIMIT = 600, 3000  # seconds for the tests of one step
 EACH_LIMIT = 300  # seconds for one test
 ATTEMPTS = 3
+BATCH = 10  # of one folder in a row, because a header that changes back is compiled everywhere
 OPEN = "passed its folder's tests"  # with --own: a later call continues
 FAILED_TEST = re.compile(r"^\s*\d+ - (\S+) \((.*)\)$", re.MULTILINE)
 
@@ -174,24 +175,32 @@ def print_table(root, drawn, share, outcomes):
     return code or (2 if counts[None] else 0)
 
 
+def test_mutant(judge, folder, mutant, outcomes, retried, own):
+    begin = time.monotonic()
+    first = 1 if outcomes.of(mutant) == OPEN and mutant.key not in retried else 0
+    outcome, by = judge.judge(folder, mutant, first, 1 if own else STEPS - first)
+    retried.discard(mutant.key)
+    outcomes.add(mutant, outcome, by, seconds_since(begin))
+    print(f"{outcome} after {seconds_since(begin):.0f} s{' by ' + by if by else ''}: {mutant.key}", flush=True)
+
+
 def test_mutants(judge, folders, drawn, share, outcomes, options):
-    """Tests mutants, one of each folder in turn, until all are tested or the time is over."""
+    """Tests mutants, some of each folder in turn, until all are tested or the time is over."""
     undecided = ("survived", OPEN) if options.retry else ()
     retried = {key for key, one in outcomes.by_key.items() if one["outcome"] in undecided}
     deadline = time.monotonic() + options.minutes * 60 if options.minutes else None
     remaining = list(folders)
-    while remaining and (deadline is None or time.monotonic() < deadline):
+    while remaining:
         folder = remaining.pop(0)
-        mutant = pending(drawn[folder.name], share[folder.name], outcomes, retried, options.own)
-        if mutant is None:
-            continue
-        begin = time.monotonic()
-        first = 1 if outcomes.of(mutant) == OPEN and mutant.key not in retried else 0
-        outcome, by = judge.judge(folder, mutant, first, 1 if options.own else STEPS - first)
-        retried.discard(mutant.key)
-        outcomes.add(mutant, outcome, by, seconds_since(begin))
-        print(f"{outcome} after {seconds_since(begin):.0f} s{' by ' + by if by else ''}: {mutant.key}", flush=True)
-        remaining.append(folder)
+        for _ in range(BATCH):
+            if deadline is not None and time.monotonic() >= deadline:
+                return
+            mutant = pending(drawn[folder.name], share[folder.name], outcomes, retried, options.own)
+            if mutant is None:
+                break
+            test_mutant(judge, folder, mutant, outcomes, retried, options.own)
+        else:
+            remaining.append(folder)
 
 
 def parse(arguments):
