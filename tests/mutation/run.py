@@ -21,6 +21,7 @@ import difflib
 import json
 import pathlib
 import re
+import signal
 import sys
 import time
 
@@ -218,8 +219,14 @@ def parse(arguments):
     return parser.parse_args(arguments)
 
 
+def interrupt(_number, _frame):
+    raise KeyboardInterrupt
+
+
 def main(arguments):
     options = parse(arguments)
+    for number in (signal.SIGINT, signal.SIGTERM):  # even if the shell ignores them in the background
+        signal.signal(number, interrupt)
     root, work = plan.root_of_tree(), options.work.resolve()
     work.mkdir(parents=True, exist_ok=True)
     mutants = plan.all_mutants(root)
