@@ -6,6 +6,7 @@
 #include <gtest/gtest.h>
 
 #include <cmath>
+#include <functional>
 #include <limits>
 #include <memory>
 #include <optional>
@@ -305,6 +306,42 @@ TEST(ValueTest, ValuesNestedToAnyDepthAreDestroyed) {
   EXPECT_EQ(object.use_count(), 2);
   copy.reset();
   EXPECT_EQ(object.use_count(), 1);
+}
+
+// An object that holds a value.
+class Holder final : public Object {
+ public:
+  explicit Holder(Value value) : value_(std::move(value)) {}
+
+  std::string description() const override { return "holder"; }
+
+ private:
+  const Value value_;
+};
+
+// With several kinds in turn, a kind whose levels are destroyed by recursion would not be noticed.
+TEST(ValueTest, ValuesOfOneKindNestedToAnyDepthAreDestroyed) {
+  const std::function<Value(Value)> kinds[] = {
+      [](Value value) { return Value(Array{std::move(value)}); },
+      [](Value value) {
+        return Value(Dictionary{{"key", std::move(value)}});
+      },
+      [](Value value) {
+        return Value(DiagnosticErrorPtr(
+            std::make_shared<const DiagnosticError>("Bus", 1, Dictionary{{"value", std::move(value)}})));
+      },
+      [](Value value) {
+        return Value(Array{Value(std::shared_ptr<Object>(std::make_shared<Holder>(std::move(value))))});
+      },
+  };
+  for (const std::function<Value(Value)>& wrapped : kinds) {
+    const auto object = std::make_shared<CountingObject>();
+    Value nested(object);
+    for (int i = 0; i < 120'000; ++i) nested = wrapped(std::move(nested));
+    EXPECT_EQ(object.use_count(), 2);
+    nested = Value(1);
+    EXPECT_EQ(object.use_count(), 1);
+  }
 }
 
 }  // namespace

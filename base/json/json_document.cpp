@@ -25,6 +25,20 @@ std::string lineAt(std::string_view text, std::size_t offset) {
   return std::to_string(std::ranges::count(before, '\n') + 1);
 }
 
+// The path with control characters as in a document, so that it fits on one line.
+std::string printablePath(std::string_view path) {
+  std::string printable;
+  for (const char character : path) {
+    if (static_cast<unsigned char>(character) >= 0x20) {
+      printable += character;
+    } else {
+      const std::string quoted = Json(std::string(1, character)).dump();
+      printable += quoted.substr(1, quoted.size() - 2);
+    }
+  }
+  return printable;
+}
+
 // The progress of the parser: the number of line ends before the character that it read last. That is the last
 // character of the reported value or, for a number, the one after it.
 struct Progress {
@@ -77,7 +91,7 @@ class Tracker {
   // "NAME:LINE: PATH: " or, for the document as a whole, "NAME:LINE: ".
   std::string place() const {
     const std::string where = path();
-    return name_ + ":" + std::to_string(line()) + ": " + (where.empty() ? "" : where + ": ");
+    return name_ + ":" + std::to_string(line()) + ": " + (where.empty() ? "" : printablePath(where) + ": ");
   }
 
   std::string path() const {
@@ -183,7 +197,7 @@ std::string jsonPath(const std::string& path, std::string_view key) {
 std::string jsonPath(const std::string& path, std::size_t index) { return path + "[" + std::to_string(index) + "]"; }
 
 std::string sentenceAbout(const std::string& path, const std::string& sentence) {
-  return (path.empty() ? "the document" : path) + ": " + sentence;
+  return (path.empty() ? "the document" : printablePath(path)) + ": " + sentence;
 }
 
 std::optional<std::size_t> lineOfPath(std::string_view text, const std::string& path) {

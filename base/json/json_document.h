@@ -43,7 +43,7 @@ class JsonDocument {
 // nothing if the path does not exist there. Parses the text again.
 std::optional<std::size_t> lineOfPath(std::string_view text, const std::string& path);
 
-// "PATH: SENTENCE", with "the document" for an empty path.
+// "PATH: SENTENCE", with "the document" for an empty path. Control characters of the path are escaped.
 std::string sentenceAbout(const std::string& path, const std::string& sentence);
 
 // Extends a path: "faults" and 2 give "faults[2]"; that and "action" give "faults[2].action".

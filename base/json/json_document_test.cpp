@@ -59,6 +59,13 @@ TEST(JsonDocument, TellsTheLineOfWhatIsWrong) {
   EXPECT_EQ(problemOf("\n\xff"), "a.json:2: the file is not valid UTF-8.");
 }
 
+TEST(JsonDocument, NamesAPlaceOnOneLine) {
+  const std::string text = "{\n\"a\\n\\u0001b\": {\"c\": 1, \"c\": 2}}";
+  EXPECT_EQ(problemOf(text), "a.json:2: a\\n\\u0001b: the key \"c\" is duplicated; remove one.");
+  JsonDocument document("{\n\"a\\nb\": 1}", "a.json");
+  EXPECT_EQ(thrownText<InputError>([&] { document.fail("a\nb", "sentence.", "a\nb"); }), "a.json:2: a\\nb: sentence.");
+}
+
 TEST(JsonDocument, SaysWhyAFileCannotBeRead) {
   const auto problemWith = [](const char* file) {
     return thrownText<InputError>([file] { static_cast<void>(JsonDocument::read(file)); });

@@ -60,14 +60,22 @@ void addNames(CLI::App& command, std::vector<std::string>& names, const std::str
   command.add_option("NAME", names, whose + " name, or a pattern (*, ?, [...]) for several")->type_name("");
 }
 
-// CLI11 reads an argument in brackets as a list. A leading mark keeps such an argument a pattern.
+// CLI11 reads an argument in brackets as a list. A leading mark keeps such an argument a pattern. An argument that
+// begins with the mark gets another.
 constexpr char kMark = '\x01';
 
 std::vector<std::string> marked(std::vector<std::string> arguments) {
   for (std::string& argument : arguments) {
-    if (argument.starts_with('[') && argument.ends_with(']')) argument.insert(argument.begin(), kMark);
+    const bool isList = argument.starts_with('[') && argument.ends_with(']');
+    if (isList || argument.starts_with(kMark)) argument.insert(argument.begin(), kMark);
   }
   return arguments;
+}
+
+// The text of an error that may quote marked arguments.
+std::string withoutMarks(std::string text) {
+  for (std::size_t at = text.find(kMark); at != std::string::npos; at = text.find(kMark, at + 1)) text.erase(at, 1);
+  return text;
 }
 
 void removeMarks(RawOptions& raw) {
@@ -449,7 +457,7 @@ std::optional<Options> parseCommandLine(const std::vector<std::string>& argument
     app.exit(answer, out, err);
     *code = ExitCode::kAllPassed;
   } catch (const CLI::ParseError& refusal) {
-    err << "quazor: " << printable(refusal.what()) << "\nRun 'quazor --help' for usage.\n";
+    err << "quazor: " << printable(withoutMarks(refusal.what())) << "\nRun 'quazor --help' for usage.\n";
     *code = ExitCode::kUsage;
   } catch (const CommandError& refusal) {
     err << "quazor: " << printable(refusal.what()) << '\n';

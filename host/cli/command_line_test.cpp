@@ -182,6 +182,17 @@ TEST(ParseCommandLine, TakesPatternsAsTheyAre) {
   EXPECT_THAT(options->names, ElementsAre("[AB]", "*", "A?"));
 }
 
+TEST(ParseCommandLine, TakesArgumentsWithControlCharactersAsTheyAre) {
+  const std::optional<Options> options = parse({"verify", "\x01z", "\x01[z]", "[\x01]"}).options;
+  ASSERT_TRUE(options);
+  EXPECT_THAT(options->records, ElementsAre("\x01z", "\x01[z]", "[\x01]"));
+}
+
+TEST(ParseCommandLine, QuotesArgumentsInBracketsAsTheyAre) {
+  EXPECT_THAT(parse({"run", "A", "--format", "[json]"}).err, HasSubstr("--format: [json] not in"));
+  EXPECT_THAT(parse({"completion", "[bash]"}).err, HasSubstr("SHELL: [bash] not in"));
+}
+
 TEST(ParseCommandLine, TakesNoneForNoProfile) {
   const std::optional<Options> options = parse({"describe", "A", "--profile", "none"}).options;
   ASSERT_TRUE(options);

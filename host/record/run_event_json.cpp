@@ -187,7 +187,7 @@ std::chrono::nanoseconds nanosecondsAt(const Json& json, const char* key) {
 
 Json jsonOf(const RunStarted& event) {
   return {{"event", "runBegan"},
-          {"program", event.program},
+          {"program", losslessText(event.program)},
           {"contract", event.contract},
           {"date", timestampText(event.date)},
           {"plugins", textsJson(event.plugins)},
@@ -334,7 +334,9 @@ Json jsonOf(const FaultsCounted& event) {
 RunEvent readFaultsCounted(const Json& json) {
   FaultsCounted event;
   for (const Json& one : arrayAt(json, "faults")) {
-    event.faults.push_back({memberOf(one, "fault"), get<std::uint64_t>(one, "fired")});
+    const Json& fault = memberOf(one, "fault");
+    if (!fault.is_object()) throw InputError("\"fault\" is not an object");
+    event.faults.push_back({fault, get<std::uint64_t>(one, "fired")});
   }
   return event;
 }

@@ -87,6 +87,13 @@ std::vector<EventRow> rows() {
   };
 }
 
+TEST(EventJson, KeepsAProgramThatIsNotValidUtf8) {
+  RunStarted run = runOf({});
+  run.program = "0.1.0\xff";
+  const RunEvent again = back(run);
+  EXPECT_EQ(std::get<RunStarted>(again).program, run.program);
+}
+
 TEST(EventJson, HasAFormForEveryEvent) {
   std::set<std::size_t> kinds;
   for (const EventRow& row : rows()) {
@@ -246,6 +253,7 @@ TEST(EventFrom, SaysWhatIsWrong) {
       {R"({"event":"measured","measurements":[["R"]]})", "expected a measurement: a name and a value"},
       {R"({"event":"measured","measurements":["R"]})", "expected a measurement: a name and a value"},
       {R"({"event":"faultsCounted","faults":[{"fired":1}]})", "\"fault\" is missing"},
+      {R"({"event":"faultsCounted","faults":[{"fault":7,"fired":1}]})", "\"fault\" is not an object"},
       {R"({"event":"faultsCounted","faults":[{"fault":{},"fired":-1}]})", "\"fired\" has the wrong type"},
   };
   for (const auto& row : kRows)

@@ -1,6 +1,7 @@
 // Arbitrary input reports in any order, mixed with errors, closes and removals: only complete images reach the
 // receiver, with the values in their bytes, and nothing follows an error.
 #include "diagnostics/sensor_images/nimbe_image_experiment.h"
+#include "tests/fuzz/fuzzing.h"
 #include "tests/support/fake_sensor.h"
 
 #include <algorithm>
@@ -8,8 +9,6 @@
 #include <chrono>
 #include <cstddef>
 #include <cstdint>
-#include <cstdio>
-#include <cstdlib>
 #include <cstring>
 #include <functional>
 #include <memory>
@@ -19,12 +18,6 @@
 
 namespace quazor {
 namespace {
-
-void require(bool holds, const char* rule) {
-  if (holds) return;
-  std::fprintf(stderr, "broken: %s\n", rule);
-  std::abort();
-}
 
 // The record as a struct in this machine's layout, an independent way to read it.
 struct Record {
