@@ -88,6 +88,8 @@ DiagnosticErrorPtr errorOf(const Supervised& supervised, const std::string& duri
       return hostError(HostErrorCode::kConnectionLost, during + " wrote more than " + std::to_string(kMaxLine >> 20U) +
                                                            " MiB in one line on its process's connection to quazor" +
                                                            stuck);
+    case SupervisionEnd::kGuardLost:
+      return hostError(HostErrorCode::kConnectionLost, during + " lost the process that guards its own" + stuck);
     case SupervisionEnd::kConnectionLost: break;
     case SupervisionEnd::kEnded: {
       const ProcessEnd& end = *supervised.end;
@@ -273,7 +275,7 @@ class IsolatedRun {
 
   void conclude(const Supervised& end) {
     if (droppedLines_ > 0) log(formatMessage("%@ more lines of output were dropped", droppedLines_));
-    if (completed_) return;
+    if (completed_ && end.how != SupervisionEnd::kGuardLost) return;
     const std::string during = formatMessage("the stage %@ of %@", nameOf(stage_), diagnostic_.name);
     events_.onEvent(Failed{stage_, errorOf(end, during, deadlines_.of(stage_))});
   }

@@ -104,17 +104,18 @@ class Supervisor {
     while (!child_.end() && !gaveUp_) {
       wait();
       signals_.drain();
-      child_.reapOrphans();
       readAll();
       decide();
     }
     drainEnded();
+    if (child_.hasLostGuard() && how_ != SupervisionEnd::kInterrupted) how_ = SupervisionEnd::kGuardLost;
     return {how_, child_.end()};
   }
 
  private:
   void wait() const {
-    std::array<pollfd, 3> watched = {{{signals_.descriptor(), POLLIN, 0},
+    std::array<pollfd, 4> watched = {{{signals_.descriptor(), POLLIN, 0},
+                                      {child_.hasLostGuard() ? -1 : child_.endDescriptor(), POLLIN, 0},
                                       {connection_.atEnd() ? -1 : connection_.descriptor(), POLLIN, 0},
                                       {output_.atEnd() ? -1 : output_.descriptor(), POLLIN, 0}}};
     const auto left = std::chrono::ceil<std::chrono::milliseconds>(nextMoment() - SteadyClock::now());
@@ -139,6 +140,9 @@ class Supervisor {
     const Moment now = SteadyClock::now();
     if (limit_) {
       goOnEnding(now);
+    } else if (child_.hasLostGuard()) {
+      killed_ = true;
+      limit_ = now + kMaxDeath;
     } else if (supervision_.isDone()) {
       limit_ = now + kGrace;  // gives the child time to exit by itself
     } else if (signals_.requestsToEnd() > requestsBefore_) {

@@ -34,6 +34,7 @@ enum class SupervisionEnd {
   kDeadline,        // it was ended at the deadline
   kInterrupted,     // it was ended because this process was asked to end
   kConnectionLost,  // it was ended because it closed the connection or wrote an invalid line to it
+  kGuardLost,       // it was ended because its guard had ended
   kLineTooLong,     // it was ended because it wrote a line of more than kMaxLine bytes
 };
 
