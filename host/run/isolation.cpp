@@ -258,10 +258,14 @@ class ScanAttempt {
 // The parent's side of one run in a separate process.
 class IsolatedRun {
  public:
-  IsolatedRun(const Diagnostic& diagnostic, const Deadlines& deadlines, Progress& progress, RunEventSink& events)
-      : diagnostic_(diagnostic), deadlines_(deadlines), progress_(progress), events_(events) {
+  IsolatedRun(const Diagnostic& diagnostic, const Deadlines& deadlines, std::chrono::nanoseconds grace,
+              Progress& progress, RunEventSink& events)
+      : diagnostic_(diagnostic), deadlines_(deadlines), grace_(grace), progress_(progress), events_(events) {
     beginStage(Stage::kLoad);
   }
+
+  // True after an interrupt; the child reads it, too.
+  bool isInterrupted() const { return interrupted_.get() != 0; }
 
   Supervision supervision() {
     Supervision supervision;
@@ -269,6 +273,7 @@ class IsolatedRun {
     supervision.takeOutput = [this](std::string_view line) { takeOutput(line); };
     supervision.deadline = [this] { return deadline_; };
     supervision.isDone = [this] { return completed_; };
+    supervision.mayFinish = [this] { return interrupt(); };
     supervision.tick = [this] { progress_.update(); };
     return supervision;
   }
@@ -276,8 +281,11 @@ class IsolatedRun {
   void conclude(const Supervised& end) {
     if (droppedLines_ > 0) log(formatMessage("%@ more lines of output were dropped", droppedLines_));
     if (completed_ && end.how != SupervisionEnd::kGuardLost) return;
-    const std::string during = formatMessage("the stage %@ of %@", nameOf(stage_), diagnostic_.name);
-    events_.onEvent(Failed{stage_, errorOf(end, during, deadlines_.of(stage_))});
+    if (isInterrupted()) {
+      tellAboutTeardown();
+      return;
+    }
+    events_.onEvent(Failed{stage_, errorOf(end, during(), deadlines_.of(stage_))});
   }
 
  private:
@@ -298,6 +306,30 @@ class IsolatedRun {
     completed_ = std::holds_alternative<DiagnosticCompleted>(*event);
     events_.onEvent(*event);
     return true;
+  }
+
+  std::string during() const { return formatMessage("the stage %@ of %@", nameOf(stage_), diagnostic_.name); }
+
+  // True from the beginning of the setup, which may change the hardware, to that of the teardown, which restores it.
+  bool isBeforeTeardown() const { return stage_ == Stage::kSetup || stage_ == Stage::kRun; }
+
+  // Returns true if the child may go on.
+  bool interrupt() {
+    interrupted_.set(1);
+    events_.onEvent(Failed{stage_, errorOf({SupervisionEnd::kInterrupted, ProcessEnd()}, during(), {})});
+    if (isBeforeTeardown()) {
+      graceEnd_ = SteadyClock::now() + grace_;
+      deadline_ = std::min(deadline_, graceEnd_);
+    }
+    return isBeforeTeardown() || stage_ == Stage::kTeardown;
+  }
+
+  // After an interrupt and an early end of the child.
+  void tellAboutTeardown() {
+    if (!isBeforeTeardown() && stage_ != Stage::kTeardown) return;
+    const std::string_view what = isBeforeTeardown() ? "was not reached" : "did not end";
+    const std::string sentence = formatMessage("the teardown of %@ %@", diagnostic_.name, what);
+    events_.onEvent(Logged{{time_, LogLevel::kError, sentence, dateNow()}});
   }
 
   static bool isOfHost(const RunEvent& event) {
@@ -324,14 +356,19 @@ class IsolatedRun {
     stage_ = stage;
     between_ = false;
     deadline_ = SteadyClock::now() + deadlines_.of(stage);
+    // The child began the stage before it saw the interrupt.
+    if (isInterrupted() && stage != Stage::kTeardown) deadline_ = isBeforeTeardown() ? graceEnd_ : SteadyClock::now();
   }
 
   const Diagnostic& diagnostic_;
   const Deadlines& deadlines_;
+  const std::chrono::nanoseconds grace_;
   Progress& progress_;
   RunEventSink& events_;
+  SharedCounter interrupted_;  // 1 after an interrupt
   Stage stage_ = Stage::kLoad;
   Moment deadline_;
+  Moment graceEnd_;                  // of the setup or run that was interrupted
   std::chrono::nanoseconds time_{};  // time of the last log line
   std::size_t outputLines_ = 0;      // lines kept
   std::size_t output_ = 0;           // bytes kept
@@ -406,6 +443,7 @@ bool runIsolated(const IsolationOptions& options, WatchedSignals& signals, const
   const Deadlines deadlines(parameters, options.deadlines);
   SharedCounter frames;
   if (progress.isShown()) progress.countFrames([&frames] { return frames.get(); });
+  IsolatedRun run(diagnostic, deadlines, options.grace, progress, events);
   const auto body = [&](int descriptor) {
     const Connection connection(descriptor);
     EventsToConnection toParent(connection);
@@ -416,13 +454,13 @@ bool runIsolated(const IsolationOptions& options, WatchedSignals& signals, const
       analyzeResult(*loaded, parameters, *result, runOptions.logLevel, toParent);
     } else {
       RunOptions watched = runOptions;
+      watched.isInterrupted = [&run] { return run.isInterrupted(); };
       if (progress.isShown()) {
         watched.watchPhone = [&frames](const std::shared_ptr<const Phone>& phone) { countFrames(phone, frames); };
       }
       runDiagnostic(*loaded, parameters, watched, toParent);
     }
   };
-  IsolatedRun run(diagnostic, deadlines, progress, events);
   Supervised end;
   try {
     ChildProcess child(signals, body, options.memory, isCleanupProcess);

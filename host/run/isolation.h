@@ -9,6 +9,7 @@
 #include "host/run/diagnostic_run.h"
 #include "host/system/child_process.h"
 
+#include <chrono>
 #include <cstdint>
 #include <filesystem>
 #include <functional>
@@ -23,6 +24,7 @@ struct IsolationOptions {
   std::vector<std::filesystem::path> plugins;
   std::optional<std::uint64_t> memory;  // limit of a process's address space in bytes; nothing: the system's limit
   std::vector<DeadlineSetting> deadlines;
+  std::chrono::nanoseconds grace = kDefaultGrace;
 };
 
 // A plug-in that could not be loaded because loading it ended the process.
@@ -53,7 +55,7 @@ PluginScan scanPlugins(const IsolationOptions& options, WatchedSignals& signals,
 // Like runDiagnostic, but in a separate process, which loads only the plug-ins that the diagnostic needs, if they are
 // known. If the process ends early, a Failed event for the current stage gives the reason, and DiagnosticCompleted is
 // missing. Standard output and standard error of the process become log lines. Returns false if the user interrupted
-// the run.
+// the run: a setup or run that has begun then has the time `grace` to return, and its teardown follows.
 //
 // If `result` is not null, it is analyzed instead of running an experiment.
 bool runIsolated(const IsolationOptions& options, WatchedSignals& signals, const Diagnostic& diagnostic,

@@ -6,7 +6,6 @@
 #include <linux/close_range.h>
 #include <sys/prctl.h>
 #include <sys/resource.h>
-#include <sys/signalfd.h>
 #include <sys/syscall.h>
 #include <unistd.h>
 
@@ -25,18 +24,6 @@ namespace {
 constexpr int kConnection = 250;
 
 [[noreturn]] void refuse(const char* what) { throw std::system_error(errno, std::generic_category(), what); }
-
-sigset_t watchedSet() {
-  sigset_t set;
-  sigemptyset(&set);
-  sigaddset(&set, SIGCHLD);
-  for (const int one : {SIGINT, SIGTERM, SIGHUP}) {
-    struct sigaction action {};
-    if (sigaction(one, nullptr, &action) == 0 && action.sa_handler == SIG_IGN) continue;
-    sigaddset(&set, one);
-  }
-  return set;
-}
 
 // A pipe from the child; reading does not block. Closes the ends that it still has.
 // Thread: the one that made it.
@@ -99,38 +86,6 @@ int becomeChild(const WatchedSignals& signals, const Pipe& connection, const Pip
 void doWork(const std::function<void(int)>& body, int connection) noexcept { body(connection); }
 
 }  // namespace
-
-WatchedSignals::WatchedSignals() {
-  const sigset_t watched = watchedSet();
-  descriptor_ = ::signalfd(-1, &watched, SFD_CLOEXEC | SFD_NONBLOCK);
-  if (descriptor_ < 0) refuse("watching for signals");
-  ::sigprocmask(SIG_BLOCK, &watched, &before_);
-  // Restores the default for SIGCHLD, because a parent program may have left it ignored, and then waiting for children
-  // fails.
-  struct sigaction action {};
-  action.sa_handler = SIG_DFL;
-  ::sigaction(SIGCHLD, &action, &childrenBefore_);
-  // Orphaned descendants of a child become children of this process, which kills them.
-  ::prctl(PR_SET_CHILD_SUBREAPER, 1);
-}
-
-WatchedSignals::~WatchedSignals() {
-  ::close(descriptor_);
-  ::prctl(PR_SET_CHILD_SUBREAPER, 0);
-  restore();
-}
-
-void WatchedSignals::drain() {
-  signalfd_siginfo taken;
-  while (::read(descriptor_, &taken, sizeof taken) == sizeof taken) {
-    if (taken.ssi_signo != SIGCHLD) ++requestsToEnd_;
-  }
-}
-
-void WatchedSignals::restore() const {
-  ::sigaction(SIGCHLD, &childrenBefore_, nullptr);
-  ::sigprocmask(SIG_SETMASK, &before_, nullptr);
-}
 
 ChildProcess::ChildProcess(const WatchedSignals& signals, const std::function<void(int)>& body,
                            std::optional<std::uint64_t> memory, IsCleanupProcess isCleanupProcess) {

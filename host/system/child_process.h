@@ -2,43 +2,15 @@
 #pragma once
 
 #include "host/system/guard_process.h"
+#include "host/system/watched_signals.h"
 
 #include <cstdint>
 #include <functional>
 #include <optional>
 
-#include <signal.h>
 #include <sys/types.h>
 
 namespace quazor {
-
-// The signals of a supervising process: the end of its children, and requests to end. While this object lives, SIGINT,
-// SIGTERM, SIGHUP and SIGCHLD are delivered through it, except those that the process was started to ignore.
-//
-// Thread: the one that made it, and no other thread may be there.
-class WatchedSignals {
- public:
-  // Throws std::system_error if a system call fails.
-  WatchedSignals();
-  WatchedSignals(const WatchedSignals&) = delete;
-  WatchedSignals& operator=(const WatchedSignals&) = delete;
-  ~WatchedSignals();
-
-  // Readable when a signal is pending.
-  int descriptor() const { return descriptor_; }
-  // Reads the pending signals.
-  void drain();
-  // The number of requests to end: SIGINT, SIGTERM and SIGHUP.
-  int requestsToEnd() const { return requestsToEnd_; }
-  // Restores the original signal handling in a new child.
-  void restore() const;
-
- private:
-  sigset_t before_{};
-  struct sigaction childrenBefore_ {};
-  int descriptor_ = -1;
-  int requestsToEnd_ = 0;
-};
 
 // A child in its own session, without a terminal, below a GuardProcess. It inherits only the descriptor of its
 // connection; its standard input is empty, and its standard output and standard error go to outputDescriptor(). The

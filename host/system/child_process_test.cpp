@@ -158,7 +158,6 @@ TEST_F(ChildProcessTest, HasAConnectionWhereThereMayBeFewDescriptors) {
 }
 
 TEST_F(ChildProcessTest, IsTheFirstOfItsOwnGroupWithTheSignalsAsTheyWere) {
-  EXPECT_TRUE(isBlocked(SIGINT));
   const auto body = [](int connection) {
     const bool asItWas = !isBlocked(SIGINT) && !isBlocked(SIGTERM) && !isBlocked(SIGHUP) && !isBlocked(SIGCHLD);
     say(connection, ::getpgrp() == ::getpid() && asItWas ? "yes" : "no");
@@ -339,32 +338,7 @@ TEST(ProcessEnds, HaveATextWithTheSignalsName) {
   EXPECT_EQ(textOf({true, 64}), "signal 64");
 }
 
-TEST(WatchedSignals, CountWhatAsksTheProcessToEnd) {
-  const DefaultRequestsToEnd defaults;
-  {
-    WatchedSignals signals;
-    for (const int one : {SIGINT, SIGTERM, SIGHUP, SIGINT}) {
-      ASSERT_EQ(::kill(::getpid(), one), 0);
-      signals.drain();
-    }
-    EXPECT_EQ(signals.requestsToEnd(), 4);
-    EXPECT_TRUE(isBlocked(SIGTERM));
-  }
-  EXPECT_FALSE(isBlocked(SIGTERM));
-  EXPECT_FALSE(isBlocked(SIGCHLD));
-}
-
-TEST(WatchedSignals, LeaveIgnoredOnesIgnored) {
-  const DefaultRequestsToEnd defaults;
-  const SignalAction ignored(SIGINT, SIG_IGN);
-  WatchedSignals signals;
-  ASSERT_EQ(::kill(::getpid(), SIGINT), 0);
-  signals.drain();
-  EXPECT_EQ(signals.requestsToEnd(), 0);
-  EXPECT_FALSE(isBlocked(SIGINT));
-}
-
-TEST(WatchedSignals, SeeTheEndsOfChildrenWhereTheyWereIgnored) {
+TEST(ChildProcess, TellsItsEndWhereTheEndsOfChildrenWereIgnored) {
   const SignalAction ignored(SIGCHLD, SIG_IGN);
   {
     const WatchedSignals signals;

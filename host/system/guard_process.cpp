@@ -1,5 +1,7 @@
 #include "host/system/guard_process.h"
 
+#include "host/system/watched_signals.h"
+
 #include <poll.h>
 #include <signal.h>
 #include <sys/prctl.h>
@@ -90,8 +92,8 @@ class Guard {
     }
   }
 
-  // Reaps orphans that have ended; until then each takes up a process ID of the user. The child itself is not reaped, so
-  // that its process ID is not reused.
+  // Reaps orphans that have ended; until then each takes up a process ID of the user. The child itself is not reaped,
+  // so that its process ID is not reused.
   void reap() {
     for (;;) {
       siginfo_t info{};
@@ -132,6 +134,7 @@ int reap(pid_t process) {
 
 // Waits until the other end of the channel is closed. Returns false after a timeout.
 bool waitForEndOf(int channel) {
+  const WaitForChild wait;
   const SteadyClock::time_point limit = SteadyClock::now() + kMaxWait;
   for (;;) {
     Message message;
@@ -189,7 +192,9 @@ GuardProcess::~GuardProcess() {
     isClean = WIFEXITED(status) && WEXITSTATUS(status) == EXIT_SUCCESS;
   }
   ::close(channel_);
-  if (!isClean) endChildren(others_, isCleanupProcess_);
+  if (isClean) return;
+  const WaitForChild wait;
+  endChildren(others_, isCleanupProcess_);
 }
 
 const std::optional<ProcessEnd>& GuardProcess::end() {
@@ -211,6 +216,7 @@ const std::optional<ProcessEnd>& GuardProcess::end() {
 
 void GuardProcess::lose() {
   isLost_ = true;
+  const WaitForChild wait;
   ::kill(guard_, SIGKILL);
   reap(guard_);  // its children are those of this process from now on
   signalGroup(SIGKILL);

@@ -6,6 +6,7 @@
 #include <algorithm>
 #include <array>
 #include <cerrno>
+#include <utility>
 
 namespace quazor {
 
@@ -97,8 +98,7 @@ class Supervisor {
         signals_(signals),
         supervision_(supervision),
         connection_(child.connectionDescriptor(), kMaxLine, LineReader::LongLines::kRefuse),
-        output_(child.outputDescriptor(), kMaxOutputLength, LineReader::LongLines::kCut),
-        requestsBefore_(signals.requestsToEnd()) {}
+        output_(child.outputDescriptor(), kMaxOutputLength, LineReader::LongLines::kCut) {}
 
   Supervised run() {
     while (!child_.end() && !gaveUp_) {
@@ -108,7 +108,8 @@ class Supervisor {
       decide();
     }
     drainEnded();
-    if (child_.hasLostGuard() && how_ != SupervisionEnd::kInterrupted) how_ = SupervisionEnd::kGuardLost;
+    if (child_.hasLostGuard()) how_ = SupervisionEnd::kGuardLost;
+    if (isInterrupted_) how_ = SupervisionEnd::kInterrupted;
     return {how_, child_.end()};
   }
 
@@ -120,6 +121,7 @@ class Supervisor {
                                       {output_.atEnd() ? -1 : output_.descriptor(), POLLIN, 0}}};
     const auto left = std::chrono::ceil<std::chrono::milliseconds>(nextMoment() - SteadyClock::now());
     const auto timeout = std::clamp(left, std::chrono::milliseconds(0), kTick);
+    const WaitForChild waiting;
     ::poll(watched.data(), watched.size(), static_cast<int>(timeout.count()));
   }
 
@@ -145,8 +147,9 @@ class Supervisor {
       limit_ = now + kMaxDeath;
     } else if (supervision_.isDone()) {
       limit_ = now + kGrace;  // gives the child time to exit by itself
-    } else if (signals_.requestsToEnd() > requestsBefore_) {
+    } else if (mustEnd()) {
       beginEnding(SupervisionEnd::kInterrupted, now);
+      if (signals_.requestsToEnd() > 1) goOnEnding(now);
     } else if (isBad_) {
       beginEnding(endOfBadConnection(), now);
     } else if (connection_.atEnd()) {
@@ -157,6 +160,14 @@ class Supervisor {
     } else if (now >= supervision_.deadline()) {
       beginEnding(SupervisionEnd::kDeadline, now);
     }
+  }
+
+  // True if the child is to be ended because this process was asked to end.
+  bool mustEnd() {
+    const int requests = signals_.requestsToEnd();
+    if (requests == 0) return false;
+    const bool isFirst = !std::exchange(isInterrupted_, true);
+    return requests > 1 || (isFirst && !(supervision_.mayFinish && supervision_.mayFinish()));
   }
 
   SupervisionEnd endOfBadConnection() const {
@@ -170,7 +181,7 @@ class Supervisor {
   }
 
   void goOnEnding(Moment now) {
-    const bool impatient = signals_.requestsToEnd() > requestsBefore_ + 1;
+    const bool impatient = signals_.requestsToEnd() > 1;
     if (now < *limit_ && !(impatient && !killed_)) return;
     gaveUp_ = killed_;
     killed_ = true;
@@ -194,13 +205,13 @@ class Supervisor {
   const Supervision& supervision_;
   LineReader connection_;
   LineReader output_;
-  const int requestsBefore_;
   SupervisionEnd how_ = SupervisionEnd::kEnded;
   std::optional<Moment> limit_;  // when the wait for the child's exit ends
   bool endsByItself_ = false;
   bool killed_ = false;
   bool gaveUp_ = false;
   bool isBad_ = false;
+  bool isInterrupted_ = false;
 };
 
 }  // namespace

@@ -42,7 +42,7 @@ class SupervisionTest : public testing::Test {
     ChildProcess child(signals_, body, std::nullopt);
     const Supervised end = supervise(child, signals_, supervision_);
     took_ = steady_clock::now() - begin;
-    constexpr const char* kHow[] = {"ended", "deadline", "interrupted",
+    constexpr const char* kHow[] = {"ended",           "deadline",   "interrupted",
                                     "connection lost", "guard lost", "line too long"};
     return std::string(kHow[static_cast<int>(end.how)]) + ", " + (end.end ? textOf(*end.end) : "alive");
   }
@@ -269,8 +269,42 @@ TEST_F(SupervisionTest, EndsTheChildWhenThisProcessIsAskedToEnd) {
   ASSERT_EQ(::kill(::getpid(), SIGINT), 0);
   EXPECT_EQ(run([](int) { hang(); }), "interrupted, signal 15 (SIGTERM)");
   EXPECT_EQ(signals_.requestsToEnd(), 1);
-  // An earlier request to end does not affect a later child.
-  EXPECT_EQ(run([](int) { ::usleep(20'000); }), "ended, exit code 0");
+  EXPECT_EQ(run([](int) { hang(); }), "interrupted, signal 15 (SIGTERM)") << "of a later child, too";
+}
+
+TEST_F(SupervisionTest, LetsAnInterruptedChildFinishIfItMay) {
+  int asked = 0;
+  supervision_.mayFinish = [&asked] { return ++asked > 0; };
+  EXPECT_EQ(run([](int connection) {
+              say(connection, "interrupt\n");
+              ::usleep(20'000);
+              say(connection, "finished\n");
+            }),
+            "interrupted, exit code 0");
+  EXPECT_EQ(asked, 1);
+  EXPECT_THAT(lines_, ElementsAre("interrupt", "finished"));
+}
+
+TEST_F(SupervisionTest, EndsAnInterruptedChildAtItsNewDeadline) {
+  supervision_.mayFinish = [this] {
+    deadline_ = steady_clock::now() + 30ms;
+    return true;
+  };
+  EXPECT_EQ(run([](int connection) {
+              say(connection, "interrupt\n");
+              hang();
+            }),
+            "interrupted, signal 15 (SIGTERM)");
+  EXPECT_GE(took_, 30ms);
+}
+
+TEST_F(SupervisionTest, KillsAChildThatMayFinishWhenItIsAskedAgain) {
+  supervision_.mayFinish = [] { return ::kill(::getpid(), SIGTERM) == 0; };
+  EXPECT_EQ(run([](int connection) {
+              say(connection, "interrupt\n");
+              hang();
+            }),
+            "interrupted, signal 9 (SIGKILL)");
 }
 
 TEST_F(SupervisionTest, WaitsForAnInterruptedChildToEndByItself) {

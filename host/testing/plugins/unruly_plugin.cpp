@@ -67,6 +67,13 @@ void goWrong(int way) {
       break;
     case 15:
       for (;;) tell(std::string(1'000'000, 'x'));
+    case 16:
+      ::kill(pidOfHost(), SIGINT);
+      ::usleep(300'000);
+      break;
+    case 17:
+      ::kill(pidOfHost(), SIGINT);
+      for (;;) ::pause();
     default: break;
   }
   std::fflush(stdout);
