@@ -53,6 +53,8 @@ class Copies:
         self.program = self.directory / "quazor"
         self.program.write_bytes(content.replace(RUN_PATH, str(self.run_path).encode().ljust(len(RUN_PATH), b"\0")))
         self.program.chmod(0o755)
+        self.phone = self.directory / "phone.json"
+        self.phone.write_text('{"title": "No devices", "cameras": {}, "groups": {}, "faults": []}')
         self.cat = self.copy(pathlib.Path(shutil.which("cat")).resolve(), "cat")
 
     def copy(self, file, name=None):
@@ -62,7 +64,8 @@ class Copies:
         return made
 
     def command(self, *options):
-        return [str(self.program), "run", "TellCapabilities", "--plugin", str(self.plugin), "--profile", "none", *options]
+        return [str(self.program), "run", "TellCapabilities", "--plugin", str(self.plugin), "--profile", "none",
+                "--phone", str(self.phone), *options]
 
 
 class CapabilitiesTest(unittest.TestCase):

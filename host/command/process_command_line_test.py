@@ -374,7 +374,7 @@ class BlockedOutputTest(CommandLineTest):
     def test_one_interrupt_while_the_reports_are_written_changes_nothing(self):
         for one in (signal.SIGINT, signal.SIGTERM, signal.SIGHUP):
             with self.subTest(one):
-                process = self.ran("--output", f"junit:{self.fifo}")
+                process = self.ran("--output", f"junit:{self.fifo}", "--set", "minimum=1")
                 process.send_signal(one)
                 time.sleep(0.1)
                 self.assertIn("Fake.One", self.fifo.read_text())

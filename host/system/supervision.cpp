@@ -143,13 +143,11 @@ class Supervisor {
     if (limit_) {
       goOnEnding(now);
     } else if (child_.hasLostGuard()) {
-      killed_ = true;
-      limit_ = now + kMaxDeath;
+      kill(now);
     } else if (supervision_.isDone()) {
       limit_ = now + kGrace;  // gives the child time to exit by itself
     } else if (mustEnd()) {
       beginEnding(SupervisionEnd::kInterrupted, now);
-      if (signals_.requestsToEnd() > 1) goOnEnding(now);
     } else if (isBad_) {
       beginEnding(endOfBadConnection(), now);
     } else if (connection_.atEnd()) {
@@ -176,16 +174,25 @@ class Supervisor {
 
   void beginEnding(SupervisionEnd how, Moment now) {
     how_ = how;
+    if (isImpatient()) {
+      kill(now);
+      return;
+    }
     child_.signalGroup(SIGTERM);
     limit_ = now + kGrace;
   }
 
   void goOnEnding(Moment now) {
-    const bool impatient = signals_.requestsToEnd() > 1;
-    if (now < *limit_ && !(impatient && !killed_)) return;
+    if (now < *limit_ && !(isImpatient() && !killed_)) return;
     gaveUp_ = killed_;
-    killed_ = true;
     endsByItself_ = false;
+    kill(now);
+  }
+
+  bool isImpatient() const { return signals_.requestsToEnd() > 1; }
+
+  void kill(Moment now) {
+    killed_ = true;
     child_.signalGroup(SIGKILL);
     limit_ = now + kMaxDeath;
   }
