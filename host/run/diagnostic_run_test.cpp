@@ -477,12 +477,6 @@ TEST_F(AnalyzeResultTest, TellsTheLogLinesOfTheAnalysis) {
   EXPECT_FALSE(LogChannel::isEnabled(LogLevel::kError));
 }
 
-std::vector<Stage> stagesIn(const DiagnosticRecord& record) {
-  std::vector<Stage> stages;
-  for (const StagePeriod& one : record.stages) stages.push_back(one.stage);
-  return stages;
-}
-
 TEST_F(DiagnosticRunTest, BeginsNoSetupRunOrAnalysisAfterAnInterruptButTheTeardown) {
   const std::vector<std::vector<Stage>> stages = {
       {Stage::kDescribe},

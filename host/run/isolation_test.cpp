@@ -417,12 +417,6 @@ TEST_F(RunTest, EndsWhenTheUserInterruptsIt) {
   EXPECT_THAT(textOf(record.error), testing::EndsWith("of Unruly was interrupted"));
 }
 
-std::vector<Stage> begunStages(const DiagnosticRecord& record) {
-  std::vector<Stage> stages;
-  for (const StagePeriod& one : record.stages) stages.push_back(one.stage);
-  return stages;
-}
-
 TEST_F(RunTest, TearsDownAfterAnInterruptedRunThatReturnsInTimeAndDoesNotAnalyze) {
   const DiagnosticRecord record = runUnruly(16);
   EXPECT_FALSE(goesOn_);
@@ -430,7 +424,7 @@ TEST_F(RunTest, TearsDownAfterAnInterruptedRunThatReturnsInTimeAndDoesNotAnalyze
   EXPECT_EQ(record.verdict, Verdict::kError);
   EXPECT_EQ(textOf(record.error), "QuazorHostErrorDomain 11 the stage run of Unruly was interrupted");
   EXPECT_EQ(record.errorStage, Stage::kRun);
-  EXPECT_THAT(begunStages(record),
+  EXPECT_THAT(stagesIn(record),
               ElementsAre(Stage::kLoad, Stage::kDescribe, Stage::kSetup, Stage::kRun, Stage::kTeardown));
   EXPECT_NE(record.durations.teardown, std::nullopt);
   EXPECT_EQ(logOf(record).back(), "teardown");
@@ -442,7 +436,7 @@ TEST_F(RunTest, TellsThatThereWasNoTeardownAfterAnInterruptedRunThatDoesNotRetur
   EXPECT_FALSE(goesOn_);
   EXPECT_FALSE(isCompleted_);
   EXPECT_EQ(textOf(record.error), "QuazorHostErrorDomain 11 the stage run of Unruly was interrupted");
-  EXPECT_EQ(begunStages(record).back(), Stage::kRun);
+  EXPECT_EQ(stagesIn(record).back(), Stage::kRun);
   EXPECT_EQ(logOf(record).back(), "the teardown of Unruly was not reached");
 }
 

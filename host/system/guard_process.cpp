@@ -142,7 +142,7 @@ bool waitForEndOf(int channel) {
     if (length == 0 || (length < 0 && errno != EAGAIN)) return true;
     if (length > 0) continue;
     const auto left = std::chrono::ceil<std::chrono::milliseconds>(limit - SteadyClock::now());
-    if (left <= 0ms) return false;
+    if (left.count() <= 0) return false;
     pollfd watched{channel, POLLIN, 0};
     ::poll(&watched, 1, static_cast<int>(left.count()));
   }
