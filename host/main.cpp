@@ -2,6 +2,7 @@
 #include "host/cli/installation.h"
 #include "host/command/commands.h"
 #include "host/error/exit_code.h"
+#include "host/system/capabilities.h"
 #include "host/system/file_size_limit.h"
 #include "host/system/standard_descriptors.h"
 
@@ -39,6 +40,7 @@ bool writesUtf8() {
 
 int main(int argc, char** argv) {
   try {
+    quazor::dropCapabilities();
     quazor::openStandardDescriptors();
     quazor::failWritesBeyondFileSizeLimit();
     quazor::Console console{std::cout, std::cerr, wantsColour(), isatty(STDERR_FILENO) == 1, writesUtf8()};

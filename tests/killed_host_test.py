@@ -34,6 +34,8 @@ COUNT = 2000  # of log lines, measurements and results
 # The diagnostics in order: quiet and loud ones, and one that never ends.
 NAMES = ("CrashInRun", "LogFlood", "WellBehaved", "ManyMeasurements", "GarbageToOutput", "ForkIntoHost", "ManyResults",
          "CrashInAnalysis", "CloseConnection", "Abort", "HangInRun")
+# Diagnostics whose processes try to outlive the program.
+ESCAPES = ("ForgetParent", "ForgetParentAndSignals", "ForgetParentAndDescriptors", "LeaveDaemon")
 LOG_LINE = re.compile(r"(?:\d{4}-\d\d-\d\d )?\S+ (error|default|debug) quazor: (.*)")
 VERDICTS = {"PASS": "pass", "FAIL": "fail", "ERROR": "error"}
 
@@ -68,11 +70,11 @@ def recorded_verdicts(events):
 class Killed:
     """A run of the program that was killed, and the files that it left. `wait` returns at the time of the kill."""
 
-    def __init__(self, directory, wait):
+    def __init__(self, directory, wait, names=NAMES, settings=("--set", f"count={COUNT}")):
         self.record = directory / "record.jsonl"
-        environment = environment_with_marker(XDG_STATE_HOME=str(directory))
-        command = [PROGRAM, "run", *NAMES, "--record", str(self.record), "--log-level", "debug", "--set",
-                   f"count={COUNT}"]
+        environment = environment_with_marker(XDG_STATE_HOME=str(directory), MISBEHAVIOUR_STATE=str(directory / "state"))
+        command = [PROGRAM, "run", *names, "--record", str(self.record), "--log-level", "debug",
+                   *settings]
         for plugin in ("misbehaving", "well_behaved"):
             command += ["--plugin", str(PLUGINS / f"{plugin}.so")]
         with open(directory / "out", "wb") as out, open(directory / "err", "wb") as err:
@@ -123,6 +125,22 @@ class KilledHostTest(unittest.TestCase):
         self.assertGreater(tally["(with a child)"], KILLS / 3)
         self.assertGreater(tally["(verdicts seen)"], KILLS)
         self.assertGreater(tally["(log lines seen)"], KILLS)
+
+    def test_no_process_escapes(self):
+        for name in ESCAPES:
+            with self.subTest(name), tempfile.TemporaryDirectory() as directory:
+                state = pathlib.Path(directory) / "state"
+
+                def wait():
+                    limit = time.monotonic() + 60
+                    while not state.exists():
+                        self.assertLess(time.monotonic(), limit, "the diagnostic has not begun")
+                        time.sleep(0.005)
+
+                killed = Killed(pathlib.Path(directory), wait, [name], [])
+                self.assertEqual(killed.code, -signal.SIGKILL)
+                self.assertTrue(killed.had_children)
+                self.assertEqual(killed.left, [], "processes are left")
 
     def length_of_run(self):
         """The time in seconds until the diagnostic that never ends runs."""

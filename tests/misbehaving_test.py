@@ -105,6 +105,10 @@ def lose_connection(name, **more):
                 **more)
 
 
+def lose_guard(name):
+    return Case(name, CONNECTION_LOST, f"the stage run of {name} lost the process that guards its own")
+
+
 def too_deep(name, **more):
     return Case(name, TOO_DEEP, f"the entry 'deep' in the result of {name}Experiment is nested more than 500 levels deep",
                 stage="run", **more)
@@ -270,6 +274,8 @@ CASES = (
     hang("LeaveGroupAndHang"),
     leave("BecomeTrue"),
     lose_connection("BecomeSleep"),
+    lose_guard("KillGuard"),
+    hang("StopGuard"),
     Case("RaiseLimits", needs_memory_limit=True),
     Case("ChangeSurroundings"),
 
@@ -400,6 +406,16 @@ class MisbehavingTest(unittest.TestCase):
     def test_a_plug_in_that_changes_the_directory_harms_no_other(self):
         outcome = run([WELL_BEHAVED], ["changeDirectory_on_load", "well_behaved"], directory=PLUGINS)
         self.assertEqual(outcome.code, 0, outcome.out + outcome.err)
+
+    def test_a_process_that_kills_its_guard_does_not_pass_and_leaves_nothing(self):
+        outcome = run(["KillGuardAndFinish", WELL_BEHAVED], ["misbehaving", "well_behaved"])
+        self.assertEqual(outcome.code, 2, outcome.err)
+        events = outcome.about("KillGuardAndFinish")
+        self.assertEqual(events[-1]["verdict"], "error")
+        failed, = [one for one in events if one["event"] == "failed"]
+        self.assertIn("lost the process that guards its own", str(failed["error"]["userInfo"]))
+        self.assertEqual(outcome.left, [], "processes are left")
+        self.assertEqual(outcome.about(WELL_BEHAVED)[-1]["verdict"], "pass")
 
     def check(self, case, outcome):
         events = outcome.about(case.name)

@@ -42,6 +42,7 @@ struct RawOptions {
   std::string seed = "0";
   std::string seeds = "3";
   std::string memory;
+  std::string grace;
   std::string logLevel;
   std::string format = "text";
   bool all = false;
@@ -86,7 +87,8 @@ void removeMarks(RawOptions& raw) {
                                           &raw.parameterFiles, &raw.records, &raw.outputs, &raw.deadlines}) {
     std::for_each(texts->begin(), texts->end(), removeMark);
   }
-  for (std::string* text : {&raw.profile, &raw.phone, &raw.record, &raw.of, &raw.seed, &raw.seeds, &raw.memory}) {
+  for (std::string* text :
+       {&raw.profile, &raw.phone, &raw.record, &raw.of, &raw.seed, &raw.seeds, &raw.memory, &raw.grace}) {
     removeMark(*text);
   }
 }
@@ -119,6 +121,13 @@ void addProcessOptions(CLI::App& command, RawOptions& raw) {
       "[STAGE=]SECONDS");
   command.add_option("--memory", raw.memory, "Memory limit for each plug-in process; default 4096")
       ->type_name("MEBIBYTES|none");
+}
+
+void addGrace(CLI::App& command, RawOptions& raw) {
+  command
+      .add_option("--grace", raw.grace,
+                  "How long a setup or run may still take after an interrupt, before its teardown; default 5")
+      ->type_name("SECONDS");
 }
 
 void addParameterOptions(CLI::App& command, RawOptions& raw) {
@@ -276,8 +285,8 @@ void checkNames(const Options& options, const std::string& what) {
 }
 
 Options optionsOf(const CLI::App& command, const RawOptions& raw) {
-  for (const char* option :
-       {"--plugin", "--output", "--profile", "--parameters", "--phone", "--record", "--of", "RECORD", "--memory"}) {
+  for (const char* option : {"--plugin", "--output", "--profile", "--parameters", "--phone", "--record", "--of",
+                             "RECORD", "--memory", "--grace"}) {
     refuseEmpty(command, option);
   }
   Options options;
@@ -300,6 +309,7 @@ Options optionsOf(const CLI::App& command, const RawOptions& raw) {
   for (const std::string& text : raw.settings) options.settings.push_back(parseOverride(text));
   for (const std::string& text : raw.limits) options.limits.push_back(limitOfCommandLine(text));
   for (const std::string& text : raw.deadlines) options.deadlines.push_back(parseDeadline(text));
+  if (!raw.grace.empty()) options.grace = parseGrace(raw.grace);
   options.logLevel = logLevelOf(raw.logLevel);
   options.systemLog = raw.systemLog;
   if (command.get_option_no_throw("--tag") != nullptr) options.tags = tagsOf(raw.tags);
@@ -361,6 +371,7 @@ void declareRunningCommands(CLI::App& app, RawOptions& raw) {
   addRecords(analyze, raw, 1, 1, "The record");
   addRecord(analyze, raw);
   addLogOptions(analyze, raw);
+  for (CLI::App* const command : {&run, &experiment}) addGrace(*command, raw);
   for (CLI::App* const command : {&run, &experiment, &analyze}) {
     addPlugins(*command, raw);
     addReportOptions(*command, raw, formats);
@@ -395,6 +406,7 @@ void declareOtherCommands(CLI::App& app, RawOptions& raw) {
   addPlugins(selftest, raw);
   addReportOptions(selftest, raw, {"text", "json"});
   addProcessOptions(selftest, raw);
+  addGrace(selftest, raw);
   CLI::App& phone =
       *app.add_subcommand("phone", "Find the devices of this machine and print a starter binding for them");
   phone.add_option("WHAT", raw.names, "probe")->type_name("")->required()->expected(1)->check(CLI::IsMember({"probe"}));

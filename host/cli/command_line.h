@@ -9,6 +9,7 @@
 #include "host/report/run_report.h"
 #include "host/run/deadlines.h"
 
+#include <chrono>
 #include <cstdint>
 #include <filesystem>
 #include <optional>
@@ -55,6 +56,7 @@ struct Options {
   std::filesystem::path phone;                 // a scenario, or linux:BINDING; empty: the installed healthy one
   ReportOptions report;
   std::vector<DeadlineSetting> deadlines;
+  std::chrono::nanoseconds grace = kDefaultGrace;
   std::optional<std::uint64_t> memory;  // limit of a plug-in process, in bytes; nothing: no limit
   std::uint64_t seed = 0;
   std::uint64_t seeds = 0;  // the number of seeds, starting at 0

@@ -69,18 +69,26 @@ ExitCode explainErrors(const Options& options, const Installation& installation,
   return ExitCode::kAllPassed;
 }
 
+// Watches the signals until this process has ended: none of them may meet its default action, not even while static
+// objects are destroyed. Returns null with --in-process, where other threads may run.
+WatchedSignals* watchSignals(const Options& options) {
+  static WatchedSignals* signals = nullptr;
+  if (!options.inProcess) signals = new WatchedSignals;
+  return signals;
+}
+
 ExitCode perform(const Options& options, const Installation& installation, Console& console) {
   switch (options.command) {
     case Command::kList: return list(options, installation, console);
     case Command::kDescribe: return describe(options, installation, console);
     case Command::kRun:
-    case Command::kExperiment: return runCommand(options, installation, console);
+    case Command::kExperiment: return runCommand(options, installation, console, watchSignals(options));
     case Command::kVerify: return verifyCommand(options, console);
-    case Command::kAnalyze: return analyzeCommand(options, installation, console);
+    case Command::kAnalyze: return analyzeCommand(options, installation, console, watchSignals(options));
     case Command::kDiff: return diffCommand(options, console);
     case Command::kExplain: return explainErrors(options, installation, console);
     case Command::kDoctor: return doctorCommand(options, installation, console);
-    case Command::kSelftest: return selftestCommand(options, installation, console);
+    case Command::kSelftest: return selftestCommand(options, installation, console, watchSignals(options));
     case Command::kPhone: return phoneCommand(options, console);
     case Command::kCompletion: break;
   }

@@ -5,6 +5,7 @@
 #include "host/cli/installation.h"
 #include "host/error/exit_code.h"
 #include "host/report/run_report.h"
+#include "host/system/watched_signals.h"
 
 #include <string>
 #include <vector>
@@ -17,9 +18,11 @@ namespace quazor {
 ExitCode runProgram(const std::vector<std::string>& arguments, const Installation& installation, Console& console);
 
 // run and experiment; analyze, which repeats the analyses of a record. They throw a CommandError for any problem that
-// is found before the run starts.
-ExitCode runCommand(const Options& options, const Installation& installation, Console& console);
-ExitCode analyzeCommand(const Options& options, const Installation& installation, Console& console);
+// is found before the run starts. `signals` is null with --in-process.
+ExitCode runCommand(const Options& options, const Installation& installation, Console& console,
+                    WatchedSignals* signals);
+ExitCode analyzeCommand(const Options& options, const Installation& installation, Console& console,
+                        WatchedSignals* signals);
 
 // verify: kAllPassed if every verdict in each record follows from the rest of it and its run ended. Otherwise the worst
 // of kCannotRead (no complete line), kFailed (something is wrong) and kIncomplete (the run did not end). Throws a
@@ -37,8 +40,9 @@ ExitCode doctorCommand(const Options& options, const Installation& installation,
 
 // selftest: runs the expected outcomes of every installed phone, or of the phones named in the options, with the
 // requested number of seeds. kAllPassed if every outcome is as expected, else kFailed. Throws a CommandError if a file
-// cannot be read.
-ExitCode selftestCommand(const Options& options, const Installation& installation, Console& console);
+// cannot be read, and kInterrupted on an interrupt. `signals` is null with --in-process.
+ExitCode selftestCommand(const Options& options, const Installation& installation, Console& console,
+                         WatchedSignals* signals);
 
 // phone probe: prints the devices of this machine that a binding can use, why each fits or not, and a starter binding,
 // which goes to the output file if there is one. Missing devices are not a failure: kAllPassed. Throws a CommandError

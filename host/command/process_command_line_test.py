@@ -226,10 +226,10 @@ class InterruptTest(CommandLineTest):
         super().setUp()
         self.record = self.directory / "run.jsonl"
 
-    def interrupted(self, *arguments, signals=(signal.SIGINT,)):
+    def interrupted(self, *arguments, signals=(signal.SIGINT,), grace="0.5"):
         """Runs one diagnostic that ends at once and two that never end in time, and interrupts the second."""
         process = start("run", *self.NAMES, "--plugin", WORKING, "--phone", self.phone, "--profile", "none",
-                        "--realtime", "--set", "duration=60", "--record", self.record, *arguments)
+                        "--realtime", "--set", "duration=60", "--record", self.record, "--grace", grace, *arguments)
         self.addCleanup(process.kill)
         line = process.stderr.readline()  # the first log line: the second diagnostic is running
         self.assertIn("an error line", line)
@@ -278,8 +278,43 @@ class InterruptTest(CommandLineTest):
     def test_a_termination_ends_a_run_as_an_interrupt_does(self):
         self.interrupted(signals=[signal.SIGTERM])
 
-    def test_two_interrupts_end_it_as_well(self):
-        self.interrupted(signals=[signal.SIGINT, signal.SIGTERM])
+    def test_a_second_interrupt_kills_at_once(self):
+        begin = time.monotonic()
+        self.interrupted(signals=[signal.SIGINT, signal.SIGTERM], grace="60")
+        self.assertLess(time.monotonic() - begin, 30)
+
+    def test_a_run_that_does_not_return_in_time_has_no_teardown(self):
+        self.interrupted(grace="0.2")
+        events = self.about("Fake.One")
+        self.assertNotIn("teardown", [one.get("stage") for one in events])
+        self.assertEqual([one["text"] for one in events if one["event"] == "log"][-1],
+                         "the teardown of Fake.One was not reached")
+
+    def test_a_run_that_returns_in_time_has_its_teardown_and_no_analysis(self):
+        process = start("run", "Unruly", "Fake.One", "--plugin", UNRULY, "--plugin", WORKING, "--phone", self.phone,
+                        "--profile", "none", "--set", "way=16", "--set", "duration=1", "--record", self.record)
+        _, err = process.communicate(timeout=50)
+        self.assertEqual(process.returncode, 130, err)
+        self.assertEqual(events_in(self.record)[-1]["interrupted"], "Unruly")
+        events = self.about("Unruly")
+        self.assertEqual([one["stage"] for one in events if one["event"] == "stageEnded"],
+                         ["load", "describe", "setup", "run", "teardown"])
+        failed, = [one for one in events if one["event"] == "failed"]
+        self.assertEqual((failed["error"]["code"], failed["stage"]), (11, "run"))
+        self.assertEqual(events[-1]["verdict"], "error")
+        self.assert_verifies(self.record)
+
+    def test_a_grace_that_is_refused(self):
+        for text, problem in {"": "the value is empty", "-1": "less than zero", "soon": "not a number"}.items():
+            with self.subTest(text):
+                self.assert_refused(self.run_fake("--grace", text), 64, "--grace", problem)
+
+    def about(self, name):
+        """The recorded events of a diagnostic."""
+        events = events_in(self.record)
+        first = next(i for i, one in enumerate(events) if one.get("name") == name)
+        last = next(i for i, one in enumerate(events) if i > first and one["event"] == "diagnosticEnded")
+        return events[first:last + 1]
 
     def test_an_interrupt_behind_the_end_of_a_diagnostic_is_one_between_two(self):
         process = start("run", "Unruly", "Fake.One", "--plugin", UNRULY, "--plugin", WORKING, "--phone", self.phone,
@@ -320,6 +355,89 @@ class InterruptTest(CommandLineTest):
         process.send_signal(signal.SIGINT)
         out, _ = process.communicate(timeout=50)
         self.assertEqual(process.returncode, 0, out)
+
+
+class BlockedOutputTest(CommandLineTest):
+    """Interrupts of a program whose output nobody reads."""
+
+    def setUp(self):
+        super().setUp()
+        self.fifo = self.directory / "fifo"
+        os.mkfifo(self.fifo)
+
+    def ran(self, *arguments):
+        """A program that has run its diagnostic and now writes its reports; None if it ended before."""
+        record = self.directory / "run.jsonl"
+        process = start("run", "Fake.One", "--plugin", WORKING, "--phone", self.phone, "--profile", "none", "--set",
+                        "duration=1", "--record", record, *arguments)
+        self.addCleanup(process.communicate)
+        self.addCleanup(process.kill)
+        limit = time.monotonic() + 60
+        while not (record.exists() and '"runEnded"' in record.read_text()):
+            self.assertLess(time.monotonic(), limit)
+            time.sleep(0.01)
+        time.sleep(0.2)
+        return process
+
+    def test_a_third_interrupt_ends_it_at_once(self):
+        process = self.ran("--output", f"junit:{self.fifo}")
+        begin = time.monotonic()
+        for one in (signal.SIGINT, signal.SIGTERM, signal.SIGHUP):
+            process.send_signal(one)
+            time.sleep(0.05)
+        self.assertEqual(process.wait(20), 130)
+        self.assertLess(time.monotonic() - begin, 1.5)
+
+    def test_two_seconds_after_a_second_interrupt_it_ends(self):
+        process = self.ran("--output", f"junit:{self.fifo}")
+        process.send_signal(signal.SIGINT)
+        time.sleep(0.05)
+        self.assertIsNone(process.poll())
+        begin = time.monotonic()
+        process.send_signal(signal.SIGINT)
+        self.assertEqual(process.wait(20), 130)
+        self.assertGreater(time.monotonic() - begin, 1.5)
+
+    def test_one_interrupt_while_the_reports_are_written_changes_nothing(self):
+        for one in (signal.SIGINT, signal.SIGTERM, signal.SIGHUP):
+            with self.subTest(one):
+                process = self.ran("--output", f"junit:{self.fifo}", "--set", "minimum=1")
+                process.send_signal(one)
+                time.sleep(0.1)
+                self.assertIn("Fake.One", self.fifo.read_text())
+                self.assertEqual(process.wait(20), 1)  # the run's own code: its result is below the limit
+                (self.directory / "run.jsonl").unlink()
+
+    def test_a_pipe_that_is_not_read_does_not_keep_it_from_ending(self):
+        process = start("run", "Unruly", "--plugin", UNRULY, "--phone", self.phone, "--profile", "none", "--set",
+                        "way=8", "--log-level", "debug")
+        self.addCleanup(process.communicate)
+        self.addCleanup(process.kill)
+        children = pathlib.Path(f"/proc/{process.pid}/task/{process.pid}/children")
+        waits = pathlib.Path(f"/proc/{process.pid}/wchan")
+        limit = time.monotonic() + 60
+        while "pipe" not in waits.read_text() and time.monotonic() < limit:
+            time.sleep(0.01)
+        for _ in range(2):
+            process.send_signal(signal.SIGINT)
+            time.sleep(0.05)
+        guards = children.read_text().split()
+        self.assertEqual(process.wait(20), 130)
+        while any(pathlib.Path("/proc", guard).exists() for guard in guards):
+            self.assertLess(time.monotonic(), limit + 60)
+            time.sleep(0.01)
+
+    def test_a_record_that_is_not_read_does_not_keep_it_from_ending(self):
+        process = start("run", "Fake.One", "--plugin", WORKING, "--phone", self.phone, "--profile", "none", "--set",
+                        "duration=1", "--record", self.fifo)
+        self.addCleanup(process.communicate)
+        self.addCleanup(process.kill)
+        time.sleep(1)
+        self.assertIsNone(process.poll())
+        for _ in range(3):
+            process.send_signal(signal.SIGINT)
+            time.sleep(0.05)
+        self.assertEqual(process.wait(20), 130)
 
 
 if __name__ == "__main__":

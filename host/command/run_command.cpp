@@ -34,13 +34,11 @@ struct Job {
 // Performs the jobs in order, each in a separate process or all in this one.
 class Conductor {
  public:
-  Conductor(IsolationOptions isolation, const Options& options, RunOptions runOptions, EventPipeline& events)
-      : isolation_(std::move(isolation)),
-        runOptions_(std::move(runOptions)),
-        inProcess_(options.inProcess),
-        events_(events) {
-    if (!inProcess_) signals_.emplace();
-  }
+  // `signals` is null if the jobs are performed in this process.
+  Conductor(IsolationOptions isolation, RunOptions runOptions, WatchedSignals* signals, EventPipeline& events)
+      : isolation_(std::move(isolation)), runOptions_(std::move(runOptions)), signals_(signals), events_(events) {}
+
+  bool isInterrupted() const { return signals_ != nullptr && signals_->requestsToEnd() > 0; }
 
   // Returns the diagnostic that the user interrupted, as in RunEnded; nothing if the run continues.
   std::optional<std::string> perform(const Job& job) {
@@ -51,15 +49,14 @@ class Conductor {
     std::optional<std::string> interrupted;
     if (description.error != nullptr) {
       events_.onEvent(Failed{Stage::kDescribe, description.error});
-    } else if (inProcess_) {
+    } else if (signals_ == nullptr) {
       performHere(job);
     } else if (!runIsolated(isolation_, *signals_, diagnostic, job.bound.parameters, runOptions_, job.result,
                             events_.progress(), events_)) {
       interrupted = diagnostic.name;
-    } else if (signals_->requestsToEnd() > 0) {
-      interrupted = "";  // the interrupt came after the end of the diagnostic
     }
     events_.endDiagnostic();
+    if (!interrupted && isInterrupted()) interrupted = "";  // the interrupt came after the end of the diagnostic
     return interrupted;
   }
 
@@ -75,9 +72,8 @@ class Conductor {
 
   const IsolationOptions isolation_;
   const RunOptions runOptions_;
-  const bool inProcess_;
+  WatchedSignals* const signals_;
   EventPipeline& events_;
-  std::optional<WatchedSignals> signals_;
 };
 
 // Reports a plug-in that could not be loaded like a diagnostic.
@@ -115,7 +111,8 @@ EventPipelineOptions eventOptions(const Options& options, bool keepsLastRun) {
 }
 
 ExitCode perform(const Options& options, const Installation& installation, Console& console, RunStarted began,
-                 const std::vector<Job>& jobs, const std::vector<FailedPlugin>& failed, const RunOptions& runOptions) {
+                 const std::vector<Job>& jobs, const std::vector<FailedPlugin>& failed, const RunOptions& runOptions,
+                 WatchedSignals* signals) {
   checkOutputs(options, installation, began);
   EventPipeline events(eventOptions(options, options.command == Command::kRun), console);
   std::optional<InterruptWatcher> watcher;
@@ -123,9 +120,13 @@ ExitCode perform(const Options& options, const Installation& installation, Conso
     watcher.emplace([&events] { events.interruptAndLeave([] { ::_exit(static_cast<int>(ExitCode::kInterrupted)); }); });
   }
   const std::vector<UserLimit> limits = began.limits;
-  Conductor conductor(withoutFailed(isolationOf(options, installation), failed), options, runOptions, events);
+  Conductor conductor(withoutFailed(isolationOf(options, installation), failed), runOptions, signals, events);
   events.onEvent(std::move(began));
   for (const FailedPlugin& plugin : failed) tellFailedPlugin(plugin, events);
+  if (conductor.isInterrupted()) {
+    events.onEvent(RunEnded{"", dateNow()});
+    return ExitCode::kInterrupted;
+  }
   for (const Job& job : jobs) {
     if (std::optional<std::string> interrupted = conductor.perform(job)) {
       events.onEvent(RunEnded{std::move(interrupted), dateNow()});
@@ -167,10 +168,10 @@ std::string choosePhone(const Options& options, const Installation& installation
 
 }  // namespace
 
-ExitCode runCommand(const Options& given, const Installation& installation, Console& console) {
+ExitCode runCommand(const Options& given, const Installation& installation, Console& console, WatchedSignals* signals) {
   const Options options = given.onlyFailed ? optionsToRunAgain(given) : given;
   if (options.onlyFailed && options.names.empty()) return performNothing(options, installation, console);
-  Selection selection = select(options, installation);
+  Selection selection = select(options, installation, signals);
   std::vector<Job> jobs;
   for (ResolvedDiagnostic& one : selection.diagnostics) {
     requireParameters(one.described, one.parameters);
@@ -182,7 +183,7 @@ ExitCode runCommand(const Options& given, const Installation& installation, Cons
   RunStarted began = beginningOf(options, installation, jobs, selection.failed);
   began.phone = phone;
   began.limits = std::move(selection.limits);
-  return perform(options, installation, console, std::move(began), jobs, selection.failed, runOptions);
+  return perform(options, installation, console, std::move(began), jobs, selection.failed, runOptions, signals);
 }
 
 namespace {
@@ -203,7 +204,8 @@ ResolvedParameters reboundParameters(const DiagnosticRecord& record, const Resol
 
 }  // namespace
 
-ExitCode analyzeCommand(const Options& given, const Installation& installation, Console& console) {
+ExitCode analyzeCommand(const Options& given, const Installation& installation, Console& console,
+                        WatchedSignals* signals) {
   const RecordedRun run = runIn(given.records.front());
   Options options = given;
   if (options.profile.empty()) options.withoutProfile = true;  // the record contains the profile's values
@@ -230,7 +232,7 @@ ExitCode analyzeCommand(const Options& given, const Installation& installation, 
                        "the record '" + given.records.front().string() + "' contains no experiment result to analyze");
   }
   if (options.plugins.empty()) options.plugins.assign(run.began.plugins.begin(), run.began.plugins.end());
-  const Selection selection = select(options, installation);
+  const Selection selection = select(options, installation, signals);
   std::vector<QZExperimentResult> results(analysable.size());
   std::vector<Job> jobs;
   for (std::size_t i = 0; i < analysable.size(); ++i) {
@@ -248,7 +250,7 @@ ExitCode analyzeCommand(const Options& given, const Installation& installation, 
   began.phone = run.began.phone;
   began.seed = run.began.seed;
   began.limits = selection.limits.empty() ? run.began.limits : selection.limits;
-  return perform(options, installation, console, std::move(began), jobs, selection.failed, runOptions);
+  return perform(options, installation, console, std::move(began), jobs, selection.failed, runOptions, signals);
 }
 
 }  // namespace quazor

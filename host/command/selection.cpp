@@ -4,6 +4,7 @@
 #include "host/plugin/profile.h"
 
 #include <algorithm>
+#include <optional>
 #include <utility>
 
 namespace quazor {
@@ -58,7 +59,7 @@ std::vector<Profile> profilesOf(const Options& options, const Installation& inst
 
 // Requests the descriptions that are needed to check the profiles.
 void describeForProfiles(const Options& options, const Installation& installation, const std::vector<Profile>& profiles,
-                         std::vector<DescribedDiagnostic>& catalogue) {
+                         std::vector<DescribedDiagnostic>& catalogue, WatchedSignals* signals) {
   std::vector<Diagnostic> undescribed;
   for (const Profile& profile : profiles) {
     const std::vector<Diagnostic> more = diagnosticsToDescribe(profile, catalogue);
@@ -71,19 +72,19 @@ void describeForProfiles(const Options& options, const Installation& installatio
     }
     return;
   }
-  WatchedSignals signals;
-  if (!describeIsolated(isolationOf(options, installation), signals, undescribed, catalogue)) refuseInterrupted();
+  if (!describeIsolated(isolationOf(options, installation), *signals, undescribed, catalogue)) refuseInterrupted();
 }
 
 }  // namespace
 
 IsolationOptions isolationOf(const Options& options, const Installation& installation) {
-  IsolationOptions isolation{options.plugins, options.memory, options.deadlines};
+  IsolationOptions isolation{options.plugins, options.memory, options.deadlines, options.grace};
   if (isolation.plugins.empty()) isolation.plugins.push_back(installation.defaultPlugin());
   return isolation;
 }
 
-PluginScan scanOf(const Options& options, const Installation& installation, const DiagnosticChoice& described) {
+PluginScan scanOf(const Options& options, const Installation& installation, const DiagnosticChoice& described,
+                  WatchedSignals* signals) {
   const IsolationOptions isolation = isolationOf(options, installation);
   PluginScan scan;
   if (options.inProcess) {
@@ -93,19 +94,21 @@ PluginScan scanOf(const Options& options, const Installation& installation, cons
     for (const Diagnostic& one : catalogue) scan.catalogue.push_back({one, describeIfWanted(one, wanted)});
     return scan;
   }
-  WatchedSignals signals;
-  scan = scanPlugins(isolation, signals, described);
-  if (scan.interrupted) refuseInterrupted();
+  std::optional<WatchedSignals> ofScan;
+  if (signals == nullptr) signals = &ofScan.emplace();
+  scan = scanPlugins(isolation, *signals, described);
+  if (signals->requestsToEnd() > 0) refuseInterrupted();
   return scan;
 }
 
-PluginScan scanForSelection(const Options& options, const Installation& installation) {
-  return scanOf(options, installation,
-                [&options](const std::vector<Diagnostic>& catalogue) { return wantedOf(catalogue, options, true); });
+PluginScan scanForSelection(const Options& options, const Installation& installation, WatchedSignals* signals) {
+  return scanOf(
+      options, installation,
+      [&options](const std::vector<Diagnostic>& catalogue) { return wantedOf(catalogue, options, true); }, signals);
 }
 
-Selection select(const Options& options, const Installation& installation) {
-  PluginScan scan = scanForSelection(options, installation);
+Selection select(const Options& options, const Installation& installation, WatchedSignals* signals) {
+  PluginScan scan = scanForSelection(options, installation, signals);
   std::vector<DescribedDiagnostic>& described = scan.catalogue;
   std::vector<Diagnostic> catalogue;
   catalogue.reserve(described.size());
@@ -113,7 +116,7 @@ Selection select(const Options& options, const Installation& installation) {
 
   const std::vector<Diagnostic> wanted = wantedOf(catalogue, options, !scan.failed.empty());
   const std::vector<Profile> profiles = profilesOf(options, installation);
-  describeForProfiles(options, installation, profiles, described);
+  describeForProfiles(options, installation, profiles, described, signals);
   for (const Profile& profile : profiles) checkProfile(profile, described);
   std::vector<ParameterOverride> settings = overridesOfEnvironment();
   settings.insert(settings.end(), options.settings.begin(), options.settings.end());

@@ -20,17 +20,19 @@ IsolationOptions isolationOf(const Options& options, const Installation& install
 
 // Scans the plug-ins in separate processes, or in this one with --in-process. `described` chooses the diagnostics that
 // are asked for their descriptions. Throws a CommandError if a plug-in cannot be loaded, and kInterrupted on an
-// interrupt.
-PluginScan scanOf(const Options& options, const Installation& installation, const DiagnosticChoice& described);
+// interrupt. `signals` is the command's; null: they are watched during the scan only.
+PluginScan scanOf(const Options& options, const Installation& installation, const DiagnosticChoice& described,
+                  WatchedSignals* signals = nullptr);
 
 // Scans the plug-ins and describes only what the options select. Throws like scanOf, and for names of another kind
 // than the command expects. Unknown names are ignored.
-PluginScan scanForSelection(const Options& options, const Installation& installation);
+PluginScan scanForSelection(const Options& options, const Installation& installation,
+                            WatchedSignals* signals = nullptr);
 
 // The selected diagnostics or experiments with their parameters. All checks are done except for required parameters
 // without a value. Only the selected diagnostics are described, unless a profile's entry matches more than those and
 // sets a parameter that none of them declares; then all its matches are described. An unknown name is accepted if a
 // plug-in could not be loaded, because that plug-in may define it.
-Selection select(const Options& options, const Installation& installation);
+Selection select(const Options& options, const Installation& installation, WatchedSignals* signals = nullptr);
 
 }  // namespace quazor

@@ -34,14 +34,16 @@ std::vector<std::string> wantedScenarios(const Options& options, const Installat
 
 class Selftest {
  public:
-  Selftest(const Options& options, const Installation& installation, Console& console)
+  // `signals` is null if the diagnostics run in this process.
+  Selftest(const Options& options, const Installation& installation, Console& console, WatchedSignals* signals)
       : options_(withAllPlugins(options, installation)),
         installation_(installation),
-        scan_(scanOf(options_, installation, [](const std::vector<Diagnostic>& all) { return all; })),
+        scan_(scanOf(
+            options_, installation, [](const std::vector<Diagnostic>& all) { return all; }, signals)),
         isolation_(withoutFailed(isolationOf(options_, installation), scan_.failed)),
-        progress_(console.showsProgress ? &console.err : nullptr) {
+        progress_(console.showsProgress ? &console.err : nullptr),
+        signals_(signals) {
     profile_ = readProfile(installation.defaultProfile());
-    if (!options_.inProcess) signals_.emplace();
   }
 
   std::vector<SelftestRow> perform() {
@@ -52,7 +54,8 @@ class Selftest {
         SelftestRow row{name, expected, 0, 0, 0, {}, {}};
         for (std::uint64_t seed = 0; seed < options_.seeds; ++seed) {
           count(row, run(file, expected, seed));
-          if (signals_ && signals_->requestsToEnd() > 0) throw CommandError(ExitCode::kInterrupted, "interrupted");
+          if (signals_ != nullptr && signals_->requestsToEnd() > 0)
+            throw CommandError(ExitCode::kInterrupted, "interrupted");
         }
         rows.push_back(std::move(row));
       }
@@ -109,7 +112,7 @@ class Selftest {
     builder.onEvent(DiagnosticStarted{diagnostic.name, described.summary(), diagnostic.experimentName,
                                       diagnostic.analysisName, diagnostic.experimentOnly, parameters, seed, dateNow()});
     progress_.start(file.stem().string(), {});
-    if (options_.inProcess) {
+    if (signals_ == nullptr) {
       runDiagnostic(diagnostic, parameters, runOptions, builder);
     } else {
       runIsolated(isolation_, *signals_, diagnostic, parameters, runOptions, nullptr, progress_, builder);
@@ -125,13 +128,14 @@ class Selftest {
   const IsolationOptions isolation_;
   Progress progress_;
   Profile profile_;
-  std::optional<WatchedSignals> signals_;
+  WatchedSignals* const signals_;
 };
 
 }  // namespace
 
-ExitCode selftestCommand(const Options& options, const Installation& installation, Console& console) {
-  const std::vector<SelftestRow> rows = Selftest(options, installation, console).perform();
+ExitCode selftestCommand(const Options& options, const Installation& installation, Console& console,
+                         WatchedSignals* signals) {
+  const std::vector<SelftestRow> rows = Selftest(options, installation, console, signals).perform();
   if (rows.empty()) throw CommandError(ExitCode::kCannotRead, "nothing was tested: no phone has an expected outcome");
   std::ostringstream text;
   if (options.report.format == Format::kJson) {

@@ -24,7 +24,7 @@ enum class HostErrorCode : std::int64_t {
   kCrashed = 6,              // a signal terminated the plug-in process
   kExited = 7,               // the plug-in exited from its process
   kDeadline = 8,             // a stage took longer than its deadline
-  kConnectionLost = 9,       // the plug-in's process closed or overwrote its connection to quazor
+  kConnectionLost = 9,       // the plug-in's process closed or overwrote its connection to quazor, or lost its guard
   kNotRecorded = 10,         // the record of the run could not be written
   kInterrupted = 11,         // the user interrupted the run
   kNoProcess = 12,           // the process for the diagnostic could not be created

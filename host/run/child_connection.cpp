@@ -62,6 +62,8 @@ DiagnosticErrorPtr errorOf(const Supervised& supervised, const std::string& duri
       return hostError(HostErrorCode::kConnectionLost, during + " wrote more than " + std::to_string(kMaxLine >> 20U) +
                                                            " MiB in one line on its process's connection to quazor" +
                                                            stuck);
+    case SupervisionEnd::kGuardLost:
+      return hostError(HostErrorCode::kConnectionLost, during + " lost the process that guards its own" + stuck);
     case SupervisionEnd::kConnectionLost: break;
     case SupervisionEnd::kEnded: {
       const ProcessEnd& end = *supervised.end;

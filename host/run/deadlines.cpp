@@ -17,6 +17,16 @@ constexpr std::chrono::minutes kDefault{1};
 // Adding this to a time point does not overflow.
 constexpr std::chrono::hours kMaxLength{24 * 365};
 
+// Throws a CommandError that begins with `what`.
+std::chrono::nanoseconds parseSeconds(const std::string& what, const std::string& seconds) {
+  try {
+    const Value number = parseNumber(seconds);
+    return std::min<std::chrono::nanoseconds>(nanosecondsFromSeconds(toDouble(&number)), kMaxLength);
+  } catch (const InputError& problem) {
+    throw CommandError(ExitCode::kUsage, what + problem.what());
+  }
+}
+
 }  // namespace
 
 DeadlineSetting parseDeadline(const std::string& text) {
@@ -32,14 +42,16 @@ DeadlineSetting parseDeadline(const std::string& text) {
     }
     seconds = text.substr(equals + 1);
   }
-  try {
-    const Value number = parseNumber(seconds);
-    setting.time = std::min<std::chrono::nanoseconds>(nanosecondsFromSeconds(toDouble(&number)), kMaxLength);
-  } catch (const InputError& problem) {
-    throw CommandError(ExitCode::kUsage, what + problem.what());
-  }
+  setting.time = parseSeconds(what, seconds);
   if (setting.time.count() <= 0) throw CommandError(ExitCode::kUsage, what + "the time must be greater than zero");
   return setting;
+}
+
+std::chrono::nanoseconds parseGrace(const std::string& text) {
+  const std::string what = "--grace '" + text + "': ";
+  const std::chrono::nanoseconds grace = parseSeconds(what, text);
+  if (grace.count() < 0) throw CommandError(ExitCode::kUsage, what + "the time must not be less than zero");
+  return grace;
 }
 
 Deadlines::Deadlines(const ResolvedParameters& parameters, const std::vector<DeadlineSetting>& settings) {

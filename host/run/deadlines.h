@@ -20,6 +20,12 @@ struct DeadlineSetting {
 // Throws a CommandError (kUsage) if the text does not have that form or the time is not greater than zero.
 DeadlineSetting parseDeadline(const std::string& text);
 
+// How long a setup or run may still take after an interrupt, unless --grace says otherwise.
+inline constexpr std::chrono::seconds kDefaultGrace{5};
+
+// The time of a --grace option: SECONDS. Throws a CommandError (kUsage) if it is no number or less than zero.
+std::chrono::nanoseconds parseGrace(const std::string& text);
+
 // Thread: any; it is immutable.
 class Deadlines {
  public:

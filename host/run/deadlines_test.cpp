@@ -51,6 +51,15 @@ TEST(ParseDeadline, TakesSecondsOfOneStageOrOfAll) {
   }
 }
 
+TEST(ParseGrace, TakesSeconds) {
+  EXPECT_EQ(parseGrace("5"), 5s);
+  EXPECT_EQ(parseGrace("0"), 0s);
+  EXPECT_EQ(parseGrace("0.25"), 250ms);
+  EXPECT_EQ(parseGrace("1e300"), kYear);
+  EXPECT_EQ(refusalOf(ExitCode::kUsage, [] { parseGrace("-1"); }), "--grace '-1': the time must not be less than zero");
+  EXPECT_EQ(refusalOf(ExitCode::kUsage, [] { parseGrace("soon"); }), "--grace 'soon': 'soon' is not a number");
+}
+
 TEST(ParseDeadline, RefusesOtherTexts) {
   constexpr RefusedText kRows[] = {
       {"", "a number is missing"},

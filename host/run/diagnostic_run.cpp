@@ -10,6 +10,7 @@
 #include <algorithm>
 #include <chrono>
 #include <cstddef>
+#include <functional>
 #include <memory>
 #include <mutex>
 #include <optional>
@@ -63,8 +64,15 @@ class LogOfRun {
 // The state of one run between its stages.
 class Run {
  public:
-  Run(const Diagnostic& diagnostic, const ResolvedParameters& parameters, const Clock& clock, RunEventSink& events)
-      : diagnostic_(diagnostic), parameters_(parameters), clock_(clock), events_(events) {}
+  Run(const Diagnostic& diagnostic, const ResolvedParameters& parameters, const Clock& clock, RunEventSink& events,
+      std::function<bool()> isInterrupted = nullptr)
+      : diagnostic_(diagnostic),
+        parameters_(parameters),
+        clock_(clock),
+        events_(events),
+        isInterrupted_(std::move(isInterrupted)) {}
+
+  bool isInterrupted() const { return isInterrupted_ && isInterrupted_(); }
 
   // Returns the experiment's result, or null.
   std::unique_ptr<QZExperimentResult> experiment() {
@@ -74,7 +82,7 @@ class Run {
       experiment = make(name, diagnostic_.makeExperiment,
                         [](const QZExperiment& made) { static_cast<void>(made.experimentDescription()); });
     });
-    if (experiment == nullptr) return nullptr;
+    if (experiment == nullptr || isInterrupted()) return nullptr;
     bool ready = false;
     inStage(Stage::kSetup, [&] {
       const Dictionary parameters = dictionaryOf(parameters_.experiment);
@@ -84,13 +92,7 @@ class Run {
     });
     if (!ready) return nullptr;
     std::unique_ptr<QZExperimentResult> result;
-    inStage(Stage::kRun, [&] {
-      const bool succeeded = attempt("run of " + name, [&](DiagnosticErrorPtr* error) {
-        result = experiment->run(error);
-        return result != nullptr && isRecordable(*result, error);
-      });
-      if (!succeeded) result = nullptr;
-    });
+    if (!isInterrupted()) result = resultOf(*experiment);
     if (result != nullptr) tell(*result);
     if (auto* const teardown = dynamic_cast<QZTeardown*>(experiment.get())) {
       inStage(Stage::kTeardown, [&] {
@@ -124,6 +126,19 @@ class Run {
   }
 
  private:
+  // Returns null if the run failed.
+  std::unique_ptr<QZExperimentResult> resultOf(QZExperiment& experiment) {
+    std::unique_ptr<QZExperimentResult> result;
+    inStage(Stage::kRun, [&] {
+      const bool succeeded = attempt("run of " + diagnostic_.experimentName, [&](DiagnosticErrorPtr* error) {
+        result = experiment.run(error);
+        return result != nullptr && isRecordable(*result, error);
+      });
+      if (!succeeded) result = nullptr;
+    });
+    return result;
+  }
+
   bool isRecordable(const QZExperimentResult& result, DiagnosticErrorPtr* error) const {
     for (const auto& [key, value] : result.auxiliaryData()) {
       if (isWithinLevels(value)) continue;
@@ -197,6 +212,7 @@ class Run {
   const ResolvedParameters& parameters_;
   const Clock& clock_;
   RunEventSink& events_;
+  const std::function<bool()> isInterrupted_;
   Stage stage_ = Stage::kDescribe;
   QZDiagnosticHost host_;
 };
@@ -213,9 +229,9 @@ void runDiagnostic(const Diagnostic& diagnostic, const ResolvedParameters& param
     const LogOfRun log(platform.clock, options.logLevel, serial);
     platform.concurrency = concurrencyOfRun(std::move(platform.concurrency), log.log());
     installPlatform(platform);
-    Run run(diagnostic, parameters, *platform.clock, serial);
+    Run run(diagnostic, parameters, *platform.clock, serial, options.isInterrupted);
     const std::unique_ptr<QZExperimentResult> result = run.experiment();
-    if (result != nullptr && !diagnostic.experimentOnly) run.analyze(*result);
+    if (result != nullptr && !diagnostic.experimentOnly && !run.isInterrupted()) run.analyze(*result);
     installPlatform(nullPlatform());
   }
   events.onEvent(FaultsCounted{phone->faults()});

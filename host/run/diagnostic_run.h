@@ -15,6 +15,9 @@ namespace quazor {
 struct RunOptions {
   PhoneMaker makePhone;
   LogLevel logLevel = LogLevel::kDefault;
+  // True if the user has interrupted the run; may be empty. Asked between the stages, on the thread of the run: no
+  // setup, run or analysis begins then, but the teardown of a successful setup does.
+  std::function<bool()> isInterrupted;
   // Called with the phone of each run before it is used, and may keep it; may be empty.
   std::function<void(const std::shared_ptr<const Phone>&)> watchPhone;
 };

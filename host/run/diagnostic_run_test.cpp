@@ -477,5 +477,19 @@ TEST_F(AnalyzeResultTest, TellsTheLogLinesOfTheAnalysis) {
   EXPECT_FALSE(LogChannel::isEnabled(LogLevel::kError));
 }
 
+TEST_F(DiagnosticRunTest, BeginsNoSetupRunOrAnalysisAfterAnInterruptButTheTeardown) {
+  const std::vector<std::vector<Stage>> stages = {
+      {Stage::kDescribe},
+      {Stage::kDescribe, Stage::kSetup, Stage::kTeardown},
+      {Stage::kDescribe, Stage::kSetup, Stage::kRun, Stage::kTeardown},
+      {Stage::kDescribe, Stage::kSetup, Stage::kRun, Stage::kTeardown, Stage::kAnalyze},
+  };
+  for (std::size_t before = 0; before < stages.size(); ++before) {
+    std::size_t asked = 0;
+    options_.isInterrupted = [&asked, before] { return asked++ >= before; };
+    EXPECT_EQ(stagesIn(run()), stages[before]) << before;
+  }
+}
+
 }  // namespace
 }  // namespace quazor

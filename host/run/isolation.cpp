@@ -50,9 +50,15 @@ class EventsToConnection final : public RunEventSink {
 // The parent's side of one run in a separate process.
 class IsolatedRun {
  public:
-  IsolatedRun(const Diagnostic& diagnostic, const Deadlines& deadlines, std::string token, Progress& progress,
-              RunEventSink& events)
-      : diagnostic_(diagnostic), deadlines_(deadlines), token_(std::move(token)), progress_(progress), events_(events) {
+  IsolatedRun(const Diagnostic& diagnostic, const Deadlines& deadlines, std::chrono::nanoseconds grace,
+              std::string token, SharedCounter& interrupted, Progress& progress, RunEventSink& events)
+      : diagnostic_(diagnostic),
+        deadlines_(deadlines),
+        grace_(grace),
+        token_(std::move(token)),
+        interrupted_(interrupted),
+        progress_(progress),
+        events_(events) {
     restartDeadline();
   }
 
@@ -65,6 +71,7 @@ class IsolatedRun {
     supervision.isDone = [this, &signals, before = signals.requestsToEnd()] {
       return order_.isCompleted() && signals.requestsToEnd() > before;
     };
+    supervision.mayFinish = [this] { return interrupt(); };
     supervision.tick = [this] { progress_.update(); };
     return supervision;
   }
@@ -73,14 +80,16 @@ class IsolatedRun {
 
   void conclude(const Supervised& end) {
     if (droppedLines_ > 0) log(formatMessage("%@ more lines of output were dropped", droppedLines_));
+    if (isInterrupted()) {  // the failure was told at once
+      if (!order_.isCompleted()) tellAboutTeardown();
+      return;
+    }
     if (order_.isCompleted() && endedWell(end)) {
       events_.onEvent(DiagnosticCompleted{});
       return;
     }
-    const std::string during = order_.isCompleted()
-                                   ? diagnostic_.name + ", after its results,"
-                                   : formatMessage("the stage %@ of %@", nameOf(order_.stage()), diagnostic_.name);
-    events_.onEvent(Failed{order_.stage(), errorOf(end, during, deadlines_.of(order_.stage()))});
+    const std::string what = order_.isCompleted() ? diagnostic_.name + ", after its results," : during();
+    events_.onEvent(Failed{order_.stage(), errorOf(end, what, deadlines_.of(order_.stage()))});
   }
 
  private:
@@ -116,15 +125,49 @@ class IsolatedRun {
 
   void log(std::string text) { events_.onEvent(Logged{{time_, LogLevel::kDefault, std::move(text), dateNow()}}); }
 
-  void restartDeadline() { deadline_ = SteadyClock::now() + deadlines_.of(order_.stage()); }
+  std::string during() const { return formatMessage("the stage %@ of %@", nameOf(order_.stage()), diagnostic_.name); }
+
+  bool isInterrupted() const { return interrupted_.get() != 0; }
+
+  // True from the beginning of the setup, which may change the hardware, to that of the teardown, which restores it.
+  bool isBeforeTeardown() const { return order_.stage() == Stage::kSetup || order_.stage() == Stage::kRun; }
+
+  // Returns true if the child may go on.
+  bool interrupt() {
+    interrupted_.set(1);
+    events_.onEvent(Failed{order_.stage(), errorOf({SupervisionEnd::kInterrupted, ProcessEnd()}, during(), {})});
+    if (isBeforeTeardown()) {
+      graceEnd_ = SteadyClock::now() + grace_;
+      deadline_ = std::min(deadline_, graceEnd_);
+    }
+    return isBeforeTeardown() || order_.stage() == Stage::kTeardown;
+  }
+
+  // After an interrupt and an early end of the child.
+  void tellAboutTeardown() {
+    if (!isBeforeTeardown() && order_.stage() != Stage::kTeardown) return;
+    const std::string_view what = isBeforeTeardown() ? "was not reached" : "did not end";
+    const std::string sentence = formatMessage("the teardown of %@ %@", diagnostic_.name, what);
+    events_.onEvent(Logged{{time_, LogLevel::kError, sentence, dateNow()}});
+  }
+
+  void restartDeadline() {
+    deadline_ = SteadyClock::now() + deadlines_.of(order_.stage());
+    const bool beganTooLate = isInterrupted() && !order_.isBetweenStages() && order_.stage() != Stage::kTeardown;
+    // The child began the stage before it saw the interrupt.
+    if (beganTooLate) deadline_ = isBeforeTeardown() ? graceEnd_ : SteadyClock::now();
+  }
 
   const Diagnostic& diagnostic_;
   const Deadlines& deadlines_;
+  const std::chrono::nanoseconds grace_;
   const std::string token_;
+  SharedCounter& interrupted_;  // 1 after an interrupt
   Progress& progress_;
   RunEventSink& events_;
   EventOrder order_;
   Moment deadline_;
+  Moment graceEnd_;                  // of the setup or run that was interrupted
   std::chrono::nanoseconds time_{};  // time of the last log line
   std::size_t outputLines_ = 0;      // lines kept
   std::size_t output_ = 0;           // bytes kept
@@ -178,7 +221,7 @@ void countFrames(const std::weak_ptr<const Phone>& phone, SharedCounter& counter
 
 bool superviseRun(const IsolationOptions& options, WatchedSignals& signals, const Diagnostic& diagnostic,
                   const ResolvedParameters& parameters, const std::function<void(RunEventSink& toParent)>& body,
-                  Progress& progress, RunEventSink& events) {
+                  SharedCounter& interrupted, Progress& progress, RunEventSink& events) {
   const Deadlines deadlines(parameters, options.deadlines);
   const int requestsBefore = signals.requestsToEnd();
   std::string token;
@@ -197,7 +240,7 @@ bool superviseRun(const IsolationOptions& options, WatchedSignals& signals, cons
                                     "the process of " + diagnostic.name + " could not be created: " + problem.what())});
     return true;
   }
-  IsolatedRun run(diagnostic, deadlines, token, progress, events);
+  IsolatedRun run(diagnostic, deadlines, options.grace, token, interrupted, progress, events);
   Supervised end = supervise(*child, signals, run.supervision(signals));
   child.reset();  // ends what the process has left behind
   end = withInterrupt(end, run.isCompleted() && signals.requestsToEnd() > requestsBefore);
@@ -209,6 +252,7 @@ bool runIsolated(const IsolationOptions& options, WatchedSignals& signals, const
                  const ResolvedParameters& parameters, const RunOptions& runOptions, const QZExperimentResult* result,
                  Progress& progress, RunEventSink& events) {
   SharedCounter frames;
+  SharedCounter interrupted;
   if (progress.isShown()) progress.countFrames([&frames] { return frames.get(); });
   const auto body = [&](RunEventSink& toParent) {
     const std::optional<Diagnostic> loaded = loadDiagnostic(options, diagnostic, toParent);
@@ -218,13 +262,14 @@ bool runIsolated(const IsolationOptions& options, WatchedSignals& signals, const
       analyzeResult(*loaded, parameters, *result, runOptions.logLevel, toParent);
     } else {
       RunOptions watched = runOptions;
+      watched.isInterrupted = [&interrupted] { return interrupted.get() != 0; };
       if (progress.isShown()) {
         watched.watchPhone = [&frames](const std::shared_ptr<const Phone>& phone) { countFrames(phone, frames); };
       }
       runDiagnostic(*loaded, parameters, watched, toParent);
     }
   };
-  return superviseRun(options, signals, diagnostic, parameters, body, progress, events);
+  return superviseRun(options, signals, diagnostic, parameters, body, interrupted, progress, events);
 }
 
 }  // namespace quazor

@@ -8,7 +8,9 @@
 #include "host/run/deadlines.h"
 #include "host/run/diagnostic_run.h"
 #include "host/system/child_process.h"
+#include "host/system/shared_counter.h"
 
+#include <chrono>
 #include <cstdint>
 #include <filesystem>
 #include <functional>
@@ -21,16 +23,18 @@ struct IsolationOptions {
   std::vector<std::filesystem::path> plugins;
   std::optional<std::uint64_t> memory;  // limit of a process's address space in bytes; nothing: the system's limit
   std::vector<DeadlineSetting> deadlines;
+  std::chrono::nanoseconds grace = kDefaultGrace;
 };
 
 // Calls `body` in a separate process and passes on the events that it sends, from the first stage to
 // DiagnosticCompleted, which follows only when the process has ended by itself with exit code 0. Otherwise it is
 // missing, and a Failed event for the current or last stage gives the reason. After the last stage, the process has as
 // much time to end as that stage had. Standard output and standard error of the process become log lines. Returns false
-// if the user interrupted the run.
+// if the user interrupted the run: a setup or run that has begun then has the time `grace` to return, and its teardown
+// follows. `interrupted`, which the body can read, is 1 from then on.
 bool superviseRun(const IsolationOptions& options, WatchedSignals& signals, const Diagnostic& diagnostic,
                   const ResolvedParameters& parameters, const std::function<void(RunEventSink& toParent)>& body,
-                  Progress& progress, RunEventSink& events);
+                  SharedCounter& interrupted, Progress& progress, RunEventSink& events);
 
 // Like runDiagnostic, but in a separate process, as superviseRun, which loads only the plug-ins that the diagnostic
 // needs, if they are known.

@@ -268,6 +268,29 @@ TEST_F(RunTest, EndsWhenTheUserInterruptsIt) {
   EXPECT_THAT(textOf(record.error), testing::EndsWith("of Unruly was interrupted"));
 }
 
+TEST_F(RunTest, TearsDownAfterAnInterruptedRunThatReturnsInTimeAndDoesNotAnalyze) {
+  const DiagnosticRecord record = runUnruly(16);
+  EXPECT_FALSE(goesOn_);
+  EXPECT_TRUE(isCompleted_);
+  EXPECT_EQ(record.verdict, Verdict::kError);
+  EXPECT_EQ(textOf(record.error), "QuazorHostErrorDomain 11 the stage run of Unruly was interrupted");
+  EXPECT_EQ(record.errorStage, Stage::kRun);
+  EXPECT_THAT(stagesIn(record),
+              ElementsAre(Stage::kLoad, Stage::kDescribe, Stage::kSetup, Stage::kRun, Stage::kTeardown));
+  EXPECT_NE(record.durations.teardown, std::nullopt);
+  EXPECT_EQ(logOf(record).back(), "teardown");
+}
+
+TEST_F(RunTest, TellsThatThereWasNoTeardownAfterAnInterruptedRunThatDoesNotReturnInTime) {
+  options_.grace = 100ms;
+  const DiagnosticRecord record = runUnruly(17);
+  EXPECT_FALSE(goesOn_);
+  EXPECT_FALSE(isCompleted_);
+  EXPECT_EQ(textOf(record.error), "QuazorHostErrorDomain 11 the stage run of Unruly was interrupted");
+  EXPECT_EQ(stagesIn(record).back(), Stage::kRun);
+  EXPECT_EQ(logOf(record).back(), "the teardown of Unruly was not reached");
+}
+
 TEST_F(RunTest, EndsAPluginThatTakesMoreMemoryThanItMay) {
   if (kHasSanitizer) GTEST_SKIP() << "the sanitizer's own memory is more than any limit";
   options_.memory = std::uint64_t{2} << 30;
@@ -306,7 +329,7 @@ class SupervisedRunTest : public IsolationTest {
     Diagnostic diagnostic;
     diagnostic.name = "One";
     events_.events.clear();
-    goesOn_ = superviseRun(options_, signals_, diagnostic, {}, body, progress_, events_);
+    goesOn_ = superviseRun(options_, signals_, diagnostic, {}, body, interrupted_, progress_, events_);
     RecordBuilder builder;
     builder.onEvent(beginningOf("One"));
     for (const RunEvent& event : events_.events) builder.onEvent(event);
@@ -329,7 +352,11 @@ class SupervisedRunTest : public IsolationTest {
     events.onEvent(DiagnosticCompleted{});
   }
 
-  Progress progress_{nullptr};
+  Progress progress_ {
+    nullptr
+
+        SharedCounter interrupted_;
+  };
   EventList events_;
   std::optional<Stage> errorStage_;
   bool goesOn_ = false;

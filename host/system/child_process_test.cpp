@@ -17,7 +17,9 @@
 #include <cstdio>
 #include <cstdlib>
 #include <filesystem>
+#include <fstream>
 #include <stdexcept>
+#include <string>
 #include <thread>
 
 namespace quazor {
@@ -43,6 +45,15 @@ std::string readAll(int descriptor, std::size_t maximum = SIZE_MAX) {
     text.append(buffer, static_cast<std::size_t>(count));
   }
   return text;
+}
+
+// The state of a process (proc(5), /proc/PID/stat): 'T' if it is stopped, 0 if there is none.
+char stateOf(pid_t process) {
+  std::ifstream file("/proc/" + std::to_string(process) + "/stat");
+  std::string line;
+  std::getline(file, line);
+  const std::size_t afterName = line.rfind(") ");
+  return afterName == std::string::npos ? '\0' : line[afterName + 2];
 }
 
 bool isBlocked(int signal) {
@@ -147,7 +158,6 @@ TEST_F(ChildProcessTest, HasAConnectionWhereThereMayBeFewDescriptors) {
 }
 
 TEST_F(ChildProcessTest, IsTheFirstOfItsOwnGroupWithTheSignalsAsTheyWere) {
-  EXPECT_TRUE(isBlocked(SIGINT));
   const auto body = [](int connection) {
     const bool asItWas = !isBlocked(SIGINT) && !isBlocked(SIGTERM) && !isBlocked(SIGHUP) && !isBlocked(SIGCHLD);
     say(connection, ::getpgrp() == ::getpid() && asItWas ? "yes" : "no");
@@ -261,8 +271,8 @@ TEST_F(ChildProcessTest, LeavesOtherChildrenAlone) {
 TEST_F(ChildProcessTest, EndsByASignalToItsGroupEvenWhenItWasStopped) {
   ChildProcess child(
       signals_, [](int) { ::raise(SIGSTOP); }, std::nullopt);
-  siginfo_t info{};
-  ASSERT_EQ(::waitid(P_PID, static_cast<id_t>(child.id()), &info, WSTOPPED | WNOWAIT), 0);
+  for (int i = 0; i < 60'000 && stateOf(child.id()) != 'T'; ++i) std::this_thread::sleep_for(1ms);
+  ASSERT_EQ(stateOf(child.id()), 'T');
   EXPECT_FALSE(child.end());
   child.signalGroup(SIGTERM);
   EXPECT_EQ(endOf(child), "signal 15 (SIGTERM)");
@@ -271,11 +281,55 @@ TEST_F(ChildProcessTest, EndsByASignalToItsGroupEvenWhenItWasStopped) {
 TEST_F(ChildProcessTest, WakesItsParentByItsEnd) {
   ChildProcess child(
       signals_, [](int) {}, std::nullopt);
-  pollfd watched{signals_.descriptor(), POLLIN, 0};
+  pollfd watched{child.endDescriptor(), POLLIN, 0};
   EXPECT_EQ(::poll(&watched, 1, 60'000), 1);
-  signals_.drain();
-  EXPECT_EQ(signals_.requestsToEnd(), 0);
+  EXPECT_TRUE(child.end());
   EXPECT_EQ(::poll(&watched, 1, 0), 0);
+}
+
+TEST_F(ChildProcessTest, IsKilledWithItsDescendantsWhenItsGuardIs) {
+  pid_t orphan = 0;
+  {
+    const auto body = [](int connection) {
+      ::prctl(PR_SET_PDEATHSIG, 0);
+      const pid_t other = ::fork();
+      if (other == 0) {
+        ::setsid();
+        hang();
+      }
+      say(connection, std::to_string(other) + "\n");
+      ::kill(::getppid(), SIGKILL);
+      hang();
+    };
+    ChildProcess child(signals_, body, std::nullopt);
+    std::string text;
+    while (!text.ends_with('\n')) text += readAll(child.connectionDescriptor(), 1);
+    orphan = std::stoi(text);
+    EXPECT_EQ(endOf(child), "signal 9 (SIGKILL)");
+    EXPECT_TRUE(child.hasLostGuard());
+  }
+  EXPECT_EQ(::kill(orphan, 0), -1);
+}
+
+TEST_F(ChildProcessTest, EndsAsWellWhenItsGuardIsStopped) {
+  pid_t guard = 0;
+  {
+    const auto body = [](int connection) {
+      say(connection, std::to_string(::getppid()) + "\n");
+      ::kill(::getppid(), SIGSTOP);
+      hang();
+    };
+    ChildProcess child(signals_, body, std::nullopt);
+    std::string text;
+    while (!text.ends_with('\n')) text += readAll(child.connectionDescriptor(), 1);
+    guard = std::stoi(text);
+    for (int i = 0; i < 60'000 && stateOf(guard) != 'T'; ++i) std::this_thread::sleep_for(1ms);
+    child.signalGroup(SIGTERM);
+    EXPECT_EQ(endOf(child), "signal 15 (SIGTERM)");
+    ::kill(guard, SIGSTOP);
+    for (int i = 0; i < 60'000 && stateOf(guard) != 'T'; ++i) std::this_thread::sleep_for(1ms);
+  }
+  EXPECT_EQ(::kill(guard, 0), -1);
 }
 
 TEST(ProcessEnds, HaveATextWithTheSignalsName) {
@@ -284,32 +338,7 @@ TEST(ProcessEnds, HaveATextWithTheSignalsName) {
   EXPECT_EQ(textOf({true, 64}), "signal 64");
 }
 
-TEST(WatchedSignals, CountWhatAsksTheProcessToEnd) {
-  const DefaultRequestsToEnd defaults;
-  {
-    WatchedSignals signals;
-    for (const int one : {SIGINT, SIGTERM, SIGHUP, SIGINT}) {
-      ASSERT_EQ(::kill(::getpid(), one), 0);
-      signals.drain();
-    }
-    EXPECT_EQ(signals.requestsToEnd(), 4);
-    EXPECT_TRUE(isBlocked(SIGTERM));
-  }
-  EXPECT_FALSE(isBlocked(SIGTERM));
-  EXPECT_FALSE(isBlocked(SIGCHLD));
-}
-
-TEST(WatchedSignals, LeaveIgnoredOnesIgnored) {
-  const DefaultRequestsToEnd defaults;
-  const SignalAction ignored(SIGINT, SIG_IGN);
-  WatchedSignals signals;
-  ASSERT_EQ(::kill(::getpid(), SIGINT), 0);
-  signals.drain();
-  EXPECT_EQ(signals.requestsToEnd(), 0);
-  EXPECT_FALSE(isBlocked(SIGINT));
-}
-
-TEST(WatchedSignals, SeeTheEndsOfChildrenWhereTheyWereIgnored) {
+TEST(ChildProcess, TellsItsEndWhereTheEndsOfChildrenWereIgnored) {
   const SignalAction ignored(SIGCHLD, SIG_IGN);
   {
     const WatchedSignals signals;

@@ -6,6 +6,7 @@
 #include <algorithm>
 #include <array>
 #include <cerrno>
+#include <utility>
 
 namespace quazor {
 
@@ -97,28 +98,30 @@ class Supervisor {
         signals_(signals),
         supervision_(supervision),
         connection_(child.connectionDescriptor(), kMaxLine, LineReader::LongLines::kRefuse),
-        output_(child.outputDescriptor(), kMaxOutputLength, LineReader::LongLines::kCut),
-        requestsBefore_(signals.requestsToEnd()) {}
+        output_(child.outputDescriptor(), kMaxOutputLength, LineReader::LongLines::kCut) {}
 
   Supervised run() {
     while (!child_.end() && !gaveUp_) {
       wait();
       signals_.drain();
-      child_.reapOrphans();
       readAll();
       decide();
     }
     drainEnded();
+    if (child_.hasLostGuard()) how_ = SupervisionEnd::kGuardLost;
+    if (isInterrupted_) how_ = SupervisionEnd::kInterrupted;
     return {how_, child_.end()};
   }
 
  private:
   void wait() const {
-    std::array<pollfd, 3> watched = {{{signals_.descriptor(), POLLIN, 0},
+    std::array<pollfd, 4> watched = {{{signals_.descriptor(), POLLIN, 0},
+                                      {child_.hasLostGuard() ? -1 : child_.endDescriptor(), POLLIN, 0},
                                       {connection_.atEnd() ? -1 : connection_.descriptor(), POLLIN, 0},
                                       {output_.atEnd() ? -1 : output_.descriptor(), POLLIN, 0}}};
     const auto left = std::chrono::ceil<std::chrono::milliseconds>(nextMoment() - SteadyClock::now());
     const auto timeout = std::clamp(left, std::chrono::milliseconds(0), kTick);
+    const WaitForChild waiting;
     ::poll(watched.data(), watched.size(), static_cast<int>(timeout.count()));
   }
 
@@ -139,9 +142,11 @@ class Supervisor {
     const Moment now = SteadyClock::now();
     if (limit_) {
       goOnEnding(now);
+    } else if (child_.hasLostGuard()) {
+      kill(now);
     } else if (supervision_.isDone()) {
       limit_ = now + kGrace;  // gives the child time to exit by itself
-    } else if (signals_.requestsToEnd() > requestsBefore_) {
+    } else if (mustEnd()) {
       beginEnding(SupervisionEnd::kInterrupted, now);
     } else if (isBad_) {
       beginEnding(endOfBadConnection(), now);
@@ -155,22 +160,39 @@ class Supervisor {
     }
   }
 
+  // True if the child is to be ended because this process was asked to end.
+  bool mustEnd() {
+    const int requests = signals_.requestsToEnd();
+    if (requests == 0) return false;
+    const bool isFirst = !std::exchange(isInterrupted_, true);
+    return requests > 1 || (isFirst && !(supervision_.mayFinish && supervision_.mayFinish()));
+  }
+
   SupervisionEnd endOfBadConnection() const {
     return connection_.hasRefused() ? SupervisionEnd::kLineTooLong : SupervisionEnd::kConnectionLost;
   }
 
   void beginEnding(SupervisionEnd how, Moment now) {
     how_ = how;
+    if (isImpatient()) {
+      kill(now);
+      return;
+    }
     child_.signalGroup(SIGTERM);
     limit_ = now + kGrace;
   }
 
   void goOnEnding(Moment now) {
-    const bool impatient = signals_.requestsToEnd() > requestsBefore_ + 1;
-    if (now < *limit_ && !(impatient && !killed_)) return;
+    if (now < *limit_ && !(isImpatient() && !killed_)) return;
     gaveUp_ = killed_;
-    killed_ = true;
     endsByItself_ = false;
+    kill(now);
+  }
+
+  bool isImpatient() const { return signals_.requestsToEnd() > 1; }
+
+  void kill(Moment now) {
+    killed_ = true;
     child_.signalGroup(SIGKILL);
     limit_ = now + kMaxDeath;
   }
@@ -190,13 +212,13 @@ class Supervisor {
   const Supervision& supervision_;
   LineReader connection_;
   LineReader output_;
-  const int requestsBefore_;
   SupervisionEnd how_ = SupervisionEnd::kEnded;
   std::optional<Moment> limit_;  // when the wait for the child's exit ends
   bool endsByItself_ = false;
   bool killed_ = false;
   bool gaveUp_ = false;
   bool isBad_ = false;
+  bool isInterrupted_ = false;
 };
 
 }  // namespace

@@ -25,6 +25,9 @@ struct Supervision {
   std::function<Moment()> deadline;
   // True if no more output is expected and only the end of the child is awaited.
   std::function<bool()> isDone;
+  // Called once, at the first request to end. True if the child may go on until the deadline, which may be another one
+  // then; otherwise, and without this function, it is ended at once.
+  std::function<bool()> mayFinish;
   // Called about ten times a second; may be empty.
   std::function<void()> tick;
 };
@@ -32,8 +35,9 @@ struct Supervision {
 enum class SupervisionEnd {
   kEnded,           // the child ended by itself
   kDeadline,        // it was ended at the deadline
-  kInterrupted,     // it was ended because this process was asked to end
+  kInterrupted,     // this process was asked to end, whether the child was ended or finished by itself
   kConnectionLost,  // it was ended because it closed the connection or wrote an invalid line to it
+  kGuardLost,       // it was ended because its guard had ended
   kLineTooLong,     // it was ended because it wrote a line of more than kMaxLine bytes
 };
 
@@ -43,7 +47,7 @@ struct Supervised {
 };
 
 // Supervises the child until it has ended. To end it, sends SIGTERM to its process group and, half a second later,
-// SIGKILL. A second request to end skips the half second.
+// SIGKILL. At a second request to end, sends SIGKILL at once.
 Supervised supervise(ChildProcess& child, WatchedSignals& signals, const Supervision& supervision);
 
 }  // namespace quazor

@@ -43,7 +43,8 @@ class SupervisionTest : public testing::Test {
     ChildProcess child(signals_, body, std::nullopt);
     const Supervised end = supervise(child, signals_, supervision_);
     took_ = steady_clock::now() - begin;
-    constexpr const char* kHow[] = {"ended", "deadline", "interrupted", "connection lost", "line too long"};
+    constexpr const char* kHow[] = {"ended",           "deadline",   "interrupted",
+                                    "connection lost", "guard lost", "line too long"};
     return std::string(kHow[static_cast<int>(end.how)]) + ", " + (end.end ? textOf(*end.end) : "alive");
   }
 
@@ -275,8 +276,42 @@ TEST_F(SupervisionTest, EndsTheChildWhenThisProcessIsAskedToEnd) {
   ASSERT_EQ(::kill(::getpid(), SIGINT), 0);
   EXPECT_EQ(run([](int) { hang(); }), "interrupted, signal 15 (SIGTERM)");
   EXPECT_EQ(signals_.requestsToEnd(), 1);
-  // An earlier request to end does not affect a later child.
-  EXPECT_EQ(run([](int) { ::usleep(20'000); }), "ended, exit code 0");
+  EXPECT_EQ(run([](int) { hang(); }), "interrupted, signal 15 (SIGTERM)") << "of a later child, too";
+}
+
+TEST_F(SupervisionTest, LetsAnInterruptedChildFinishIfItMay) {
+  int asked = 0;
+  supervision_.mayFinish = [&asked] { return ++asked > 0; };
+  EXPECT_EQ(run([](int connection) {
+              say(connection, "interrupt\n");
+              ::usleep(20'000);
+              say(connection, "finished\n");
+            }),
+            "interrupted, exit code 0");
+  EXPECT_EQ(asked, 1);
+  EXPECT_THAT(lines_, ElementsAre("interrupt", "finished"));
+}
+
+TEST_F(SupervisionTest, EndsAnInterruptedChildAtItsNewDeadline) {
+  supervision_.mayFinish = [this] {
+    deadline_ = steady_clock::now() + 30ms;
+    return true;
+  };
+  EXPECT_EQ(run([](int connection) {
+              say(connection, "interrupt\n");
+              hang();
+            }),
+            "interrupted, signal 15 (SIGTERM)");
+  EXPECT_GE(took_, 30ms);
+}
+
+TEST_F(SupervisionTest, KillsAChildThatMayFinishWhenItIsAskedAgain) {
+  supervision_.mayFinish = [] { return ::kill(::getpid(), SIGTERM) == 0; };
+  EXPECT_EQ(run([](int connection) {
+              say(connection, "interrupt\n");
+              hang();
+            }),
+            "interrupted, signal 9 (SIGKILL)");
 }
 
 TEST_F(SupervisionTest, WaitsForAnInterruptedChildToEndByItself) {
@@ -318,31 +353,40 @@ TEST_F(SupervisionTest, DoesNotWaitForWhatTheChildLeavesBehind) {
 }
 
 TEST_F(SupervisionTest, ReapsOrphansOfTheChildWhileItRuns) {
-  int seen = 0;  // how often a zombie was there after all had ended
-  const auto tickOfBase = supervision_.tick;
-  supervision_.tick = [&] {
-    tickOfBase();
-    if (lines_.empty() || lines_.back() != "all have ended") return;
-    siginfo_t info{};
-    if (::waitid(P_ALL, 0, &info, WEXITED | WNOHANG | WNOWAIT) == 0 && info.si_pid != 0) ++seen;
-  };
   EXPECT_EQ(run([](int connection) {
-              for (int i = 0; i < 20; ++i) {
+              int ends[2];
+              if (::pipe(ends) != 0) ::_exit(1);
+              constexpr int kOrphans = 20;
+              for (int i = 0; i < kOrphans; ++i) {
                 const pid_t parent = ::fork();
                 if (parent == 0) {
-                  if (::fork() == 0) ::usleep(1000);  // ends as an orphan
+                  const pid_t orphan = ::fork();
+                  if (orphan == 0) ::usleep(1000);
+                  if (orphan > 0 && ::write(ends[1], &orphan, sizeof orphan) != sizeof orphan) ::_exit(1);
                   ::_exit(0);
                 }
                 ::waitpid(parent, nullptr, 0);
               }
-              ::usleep(300'000);
-              say(connection, "all have ended\n");
-              ::usleep(300'000);
-              say(connection, "looked\n");
+              // A zombie can still be sent a signal.
+              for (int i = 0; i < kOrphans; ++i) {
+                pid_t orphan = 0;
+                if (::read(ends[0], &orphan, sizeof orphan) != sizeof orphan) ::_exit(1);
+                while (::kill(orphan, 0) == 0) ::usleep(1000);
+              }
+              say(connection, "all are reaped\n");
+            }),
+            "ended, exit code 0");
+  EXPECT_THAT(lines_, ElementsAre("all are reaped"));
+}
+
+TEST_F(SupervisionTest, EndsAChildThatHasLostItsGuard) {
+  EXPECT_EQ(run([](int connection) {
+              say(connection, "one\n");
+              ::kill(::getppid(), SIGKILL);
               hang();
-            }).substr(0, 8),
-            "deadline");
-  EXPECT_EQ(seen, 0);
+            }),
+            "guard lost, signal 9 (SIGKILL)");
+  EXPECT_THAT(lines_, ElementsAre("one"));
 }
 
 TEST_F(SupervisionTest, NeedsNoTick) {

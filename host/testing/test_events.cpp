@@ -77,4 +77,10 @@ std::string namesOf(const std::vector<RunEvent>& events) {
   return names;
 }
 
+std::vector<Stage> stagesIn(const DiagnosticRecord& record) {
+  std::vector<Stage> stages;
+  for (const StagePeriod& one : record.stages) stages.push_back(one.stage);
+  return stages;
+}
+
 }  // namespace quazor

@@ -40,4 +40,7 @@ std::vector<RunEvent> wholeRun();
 // The names of the events in order, separated by spaces.
 std::string namesOf(const std::vector<RunEvent>& events);
 
+// The stages that the diagnostic began.
+std::vector<Stage> stagesIn(const DiagnosticRecord& record);
+
 }  // namespace quazor

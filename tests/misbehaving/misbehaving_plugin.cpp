@@ -9,6 +9,7 @@ namespace {
   addEndings();
   addDescriptors();
   addProcesses();
+  addEscapes();
   addResults();
 }
 

@@ -33,6 +33,7 @@ void crash();
 void addEndings();      // that end their process or never return
 void addDescriptors();  // that use descriptors they do not own
 void addProcesses();    // that create processes or modify their own
+void addEscapes();      // that try to outlive the program
 void addResults();      // with excessive results and logs
 
 }  // namespace quazor::misbehaving

@@ -10,6 +10,7 @@
 #include <chrono>
 #include <cstdio>
 #include <cstdlib>
+#include <fstream>
 #include <memory>
 #include <string>
 #include <string_view>
@@ -35,13 +36,21 @@ constexpr std::string_view kPass =
 {"event":"diagnosticCompleted"}
 )";
 
+// The grandparent of this process: its parent is the process that guards it.
+pid_t pidOfHost() {
+  std::ifstream stat("/proc/" + std::to_string(::getppid()) + "/stat");  // proc(5): PID (NAME) STATE PARENT
+  std::string word;
+  for (int i = 0; i < 4; ++i) stat >> word;
+  return std::stoi(word);
+}
+
 // Interrupts quazor when it is destroyed.
 class LateInterrupt {
  public:
   LateInterrupt() = default;
   LateInterrupt(const LateInterrupt&) = delete;
   LateInterrupt& operator=(const LateInterrupt&) = delete;
-  ~LateInterrupt() { ::kill(::getppid(), SIGINT); }
+  ~LateInterrupt() { ::kill(pidOfHost(), SIGINT); }
 };
 
 // Interrupts quazor when the phone, which must have virtual time, is destroyed, after the results were sent.
@@ -83,6 +92,13 @@ void goWrong(int way) {
       break;
     case 15:
       for (;;) tell(std::string(1'000'000, 'x'));
+    case 16:
+      ::kill(pidOfHost(), SIGINT);
+      ::usleep(300'000);
+      break;
+    case 17:
+      ::kill(pidOfHost(), SIGINT);
+      for (;;) ::pause();
     default: break;
   }
   std::fflush(stdout);
