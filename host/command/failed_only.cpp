@@ -1,8 +1,12 @@
 #include "host/command/failed_only.h"
 
+#include "host/command/selection.h"
 #include "host/device/phone.h"
 #include "host/record/previous_run.h"
 #include "host/record/record_file.h"
+
+#include <sys/stat.h>
+#include <unistd.h>
 
 #include <algorithm>
 #include <utility>
@@ -43,9 +47,21 @@ Profile recordedProfile(const std::filesystem::path& record, const RecordedRun& 
   return profile;
 }
 
+// True for the record that quazor wrote for this user.
+bool isOwn(const std::filesystem::path& record, const Options& options) {
+  struct stat status {};
+  return options.failedOf.empty() && ::stat(record.c_str(), &status) == 0 && status.st_uid == ::geteuid();
+}
+
+std::vector<std::filesystem::path> pluginsToLoadAgain(const RecordedRun& run, bool own,
+                                                      const Installation& installation) {
+  if (!own) return recordedPlugins(run.began.plugins, installation);
+  return {run.began.plugins.begin(), run.began.plugins.end()};
+}
+
 }  // namespace
 
-Options optionsToRunAgain(Options options) {
+Options optionsToRunAgain(Options options, const Installation& installation) {
   const std::filesystem::path record = options.failedOf.empty() ? previousRunFile() : options.failedOf;
   if (record.empty() || (options.failedOf.empty() && !std::filesystem::exists(record))) {
     throw CommandError(ExitCode::kCannotRead, "no previous run is recorded; use --of RECORD to name a record");
@@ -54,7 +70,7 @@ Options optionsToRunAgain(Options options) {
   refuseFailedPlugins(run);
   options.names = failedNames(run);
   options.recorded = recordedProfile(record, run, options.names);
-  if (options.plugins.empty()) options.plugins.assign(run.began.plugins.begin(), run.began.plugins.end());
+  if (options.plugins.empty()) options.plugins = pluginsToLoadAgain(run, isOwn(record, options), installation);
   if (options.phone.empty()) {
     options.phone = run.began.phone;
     if (bindingNamed(options.phone) && (options.realTime || options.seed != 0)) {

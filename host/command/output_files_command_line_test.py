@@ -6,6 +6,8 @@ import unittest
 
 from command_line_fixture import WORKING, CommandLineTest, quazor
 
+PLUGIN = ("--plugin", WORKING)
+
 
 class OutputFilesTest(CommandLineTest):
     """Outputs that name an input of the same run."""
@@ -27,9 +29,9 @@ class OutputFilesTest(CommandLineTest):
         for name in (self.record, symbolic, hard, f"{self.directory}/./run.jsonl"):
             for option in (["--record", name], ["--output", name], ["--output", f"json:{name}"]):
                 with self.subTest(option):
-                    self.assert_untouched(self.record, quazor("analyze", self.record, *option))
-                    self.assert_untouched(self.record, quazor("run", "--only", "failed", "--of", self.record, *option))
-        self.assert_untouched(self.record, quazor("analyze", hard, "--record", symbolic))
+                    self.assert_untouched(self.record, quazor("analyze", self.record, *PLUGIN, *option))
+                    self.assert_untouched(self.record, quazor("run", "--only", "failed", "--of", self.record, *PLUGIN, *option))
+        self.assert_untouched(self.record, quazor("analyze", hard, *PLUGIN, "--record", symbolic))
 
     def test_the_phone_the_profile_the_parameters_and_the_plug_in(self):
         profile = self.write("profile.json", '{"schema": 1, "entries": []}')

@@ -6,6 +6,7 @@
 #include "host/model/run_event.h"
 #include "host/plugin/diagnostic_registry.h"
 #include "host/plugin/parameters.h"
+#include "host/run/log_limit.h"
 
 #include <functional>
 #include <memory>
@@ -15,6 +16,7 @@ namespace quazor {
 struct RunOptions {
   PhoneMaker makePhone;
   LogLevel logLevel = LogLevel::kDefault;
+  LogLimit logLimit;  // of a run in a separate process, which then does not send what would not be kept
   // Called with the phone of each run before it is used, and may keep it; may be empty.
   std::function<void(const std::shared_ptr<const Phone>&)> watchPhone;
 };

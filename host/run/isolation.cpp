@@ -10,6 +10,7 @@
 #include "host/plugin/plugin_loader.h"
 #include "host/record/lossless_json.h"
 #include "host/record/run_event_json.h"
+#include "host/run/log_limit.h"
 #include "host/system/shared_counter.h"
 #include "host/system/supervision.h"
 #include "host/text/timestamp.h"
@@ -271,7 +272,9 @@ class IsolatedRun {
     return supervision;
   }
 
-  void conclude(const Supervised& end) {
+  // `leftOut` is the number of log lines that the process did not send.
+  void conclude(const Supervised& end, std::uint64_t leftOut) {
+    if (leftOut > 0) events_.onEvent(leftOutLine(leftOut, time_));
     if (droppedLines_ > 0) log(formatMessage("%@ more lines of output were dropped", droppedLines_));
     if (completed_) return;
     const std::string during = formatMessage("the stage %@ of %@", nameOf(stage_), diagnostic_.name);
@@ -316,7 +319,9 @@ class IsolatedRun {
     log("output: " + std::string(line));
   }
 
-  void log(std::string text) { events_.onEvent(Logged{{time_, LogLevel::kDefault, std::move(text), dateNow()}}); }
+  void log(std::string text) {
+    events_.onEvent(Logged{{time_, LogLevel::kDefault, std::move(text), dateNow()}, true});
+  }
 
   void beginStage(Stage stage) {
     stage_ = stage;
@@ -403,10 +408,12 @@ bool runIsolated(const IsolationOptions& options, WatchedSignals& signals, const
                  Progress& progress, RunEventSink& events) {
   const Deadlines deadlines(parameters, options.deadlines);
   SharedCounter frames;
+  SharedCounter leftOut;
   if (progress.isShown()) progress.countFrames([&frames] { return frames.get(); });
   const auto body = [&](int descriptor) {
     const Connection connection(descriptor);
-    EventsToConnection toParent(connection);
+    EventsToConnection everything(connection);
+    LimitedLog toParent(everything, runOptions.logLimit, leftOut);
     const std::optional<Diagnostic> loaded = loadDiagnostic(options, diagnostic, toParent);
     if (!loaded) {
       toParent.onEvent(DiagnosticCompleted{});
@@ -431,7 +438,7 @@ bool runIsolated(const IsolationOptions& options, WatchedSignals& signals, const
                                     "the process of " + diagnostic.name + " could not be created: " + problem.what())});
     return true;
   }
-  run.conclude(end);
+  run.conclude(end, leftOut.get());
   return end.how != SupervisionEnd::kInterrupted;
 }
 
