@@ -106,8 +106,8 @@ void removeMarks(RawOptions& raw) {
        {&raw.names, &raw.plugins, &raw.settings, &raw.parameterFiles, &raw.records, &raw.outputs, &raw.deadlines}) {
     std::for_each(texts->begin(), texts->end(), removeMark);
   }
-  for (std::string* text : {&raw.profile, &raw.phone, &raw.record, &raw.of, &raw.seed, &raw.seeds, &raw.memory,
-                            &raw.logLimit}) {
+  for (std::string* text :
+       {&raw.profile, &raw.phone, &raw.record, &raw.of, &raw.seed, &raw.seeds, &raw.memory, &raw.logLimit}) {
     removeMark(*text);
   }
 }
@@ -295,9 +295,8 @@ void checkNames(const Options& options, const std::string& what) {
 }
 
 Options optionsOf(const CLI::App& command, const RawOptions& raw) {
-  for (const char* option :
-       {"--plugin", "--output", "--profile", "--parameters", "--phone", "--record", "--of", "RECORD", "--memory",
-                             "--log-limit"}) {
+  for (const char* option : {"--plugin", "--output", "--profile", "--parameters", "--phone", "--record", "--of",
+                             "RECORD", "--memory", "--log-limit"}) {
     refuseEmpty(command, option);
   }
   Options options;

@@ -109,7 +109,9 @@ TEST(ParseCommandLine, ReadsHowMuchMemoryThereIs) {
 }
 
 TEST(ParseCommandLine, ReadsHowMuchOfTheLogIsKept) {
-  const auto limitOf = [](const std::string& text) { return parse({"run", "A", "--log-limit", text}).options->logLimit; };
+  const auto limitOf = [](const std::string& text) {
+    return parse({"run", "A", "--log-limit", text}).options->logLimit;
+  };
   EXPECT_EQ(limitOf("none").lines, UINT64_MAX);
   EXPECT_EQ(limitOf("none").bytes, UINT64_MAX);
   EXPECT_EQ(limitOf("5").lines, 5U);

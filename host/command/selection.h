@@ -19,8 +19,8 @@ struct Selection {
 // The plug-ins that the options name, or the installed one, and the limits of their processes.
 IsolationOptions isolationOf(const Options& options, const Installation& installation);
 
-// The installed plug-ins of a record. Anybody may have written it, so it cannot make quazor load any other file: throws a
-// CommandError (kCannotRead) that asks for --plugin.
+// The installed plug-ins of a record. Anybody may have written it, so it cannot make quazor load any other file: throws
+// a CommandError (kCannotRead) that asks for --plugin.
 std::vector<std::filesystem::path> recordedPlugins(const std::vector<std::string>& recorded,
                                                    const Installation& installation);
 

@@ -4,6 +4,7 @@
 #include "base/text/nearest_name.h"
 #include "contract/contract.h"
 #include "host/error/exit_code.h"
+#include "host/error/host_error.h"
 #include "host/plugin/shared_object.h"
 
 #include <dlfcn.h>
@@ -39,6 +40,7 @@ void loadPlugin(const std::filesystem::path& file) {
   const QZLab& lab = QZLab::defaultLab();
   const std::size_t registered = lab.registrations().size();
   const std::size_t refused = lab.refusedNames().size();
+  const FloatingPointGuard guard;  // initializers of code that is compiled for speed change it
   // An absolute path contains a slash, so the linker opens this file and does not search for it.
   if (dlopen(std::filesystem::absolute(file).c_str(), RTLD_NOW | RTLD_LOCAL) == nullptr) {
     const char* message = dlerror();

@@ -319,9 +319,7 @@ class IsolatedRun {
     log("output: " + std::string(line));
   }
 
-  void log(std::string text) {
-    events_.onEvent(Logged{{time_, LogLevel::kDefault, std::move(text), dateNow()}, true});
-  }
+  void log(std::string text) { events_.onEvent(Logged{{time_, LogLevel::kDefault, std::move(text), dateNow()}, true}); }
 
   void beginStage(Stage stage) {
     stage_ = stage;

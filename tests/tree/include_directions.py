@@ -81,7 +81,7 @@ for name, below in {
     "device": ["error", "text"],
     "plugin": ["error", "text"],
     "model": ["device", "error", "plugin", "text"],
-    "record": ["error", "model", "text"],
+    "record": ["error", "model", "system", "text"],
     "report": ["device", "error", "model", "plugin", "record", "system", "text"],
     "run": ["device", "error", "model", "plugin", "record", "report", "system", "text"],
     "cli": ["device", "error", "plugin", "report", "run", "text"],
