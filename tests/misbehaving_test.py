@@ -60,6 +60,7 @@ class Case:
     needs_memory_limit: bool = False
     check: object = None  # takes the case's Outcome and a TestCase
     count: int = 0  # the value of the diagnostic's parameter of that name, if it has one
+    options: tuple = ()  # more options of the program
 
 
 @dataclass
@@ -149,8 +150,16 @@ def record_stays_small(outcome, test):
 
 
 def all_lines(outcome, test):
-    lines = [text for text in texts(outcome, "LogFlood", "log", "text") if str(text).startswith("line ")]
-    test.assertEqual(lines, [f"line {i}" for i in range(MANY)])
+    test.assertEqual(flood(outcome), [f"line {i}" for i in range(MANY)])
+
+
+def flood(outcome):
+    return [text for text in texts(outcome, "LogFlood", "log", "text") if str(text).startswith("line ")]
+
+
+def all_lines_but_ten(outcome, test):
+    test.assertEqual(flood(outcome), [f"line {i}" for i in range(MANY - 10)])
+    test.assertEqual(texts(outcome, "LogFlood", "log", "text")[-1], "10 more log lines were left out (--log-limit)")
 
 
 def all_measurements(outcome, test):
@@ -279,7 +288,8 @@ CASES = (
     Case("RaiseLimits", needs_memory_limit=True),
     Case("ChangeSurroundings"),
 
-    Case("LogFlood", check=all_lines, count=MANY),
+    Case("LogFlood", check=all_lines, count=MANY, options=("--log-limit", str(MANY))),
+    Case("LogFlood", check=all_lines_but_ten, count=MANY, options=("--log-limit", str(MANY - 10))),
     Case("ManyMeasurements", check=all_measurements, count=MANY),
     Case("ManyResults", check=all_results, count=MANY),
     too_deep("DeepValue", count=1000),

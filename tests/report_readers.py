@@ -282,7 +282,8 @@ def expected_of_junit(record):
 
 
 def csv_rows(content):
-    return list(csv.reader(io.StringIO(content.decode("utf-8", "replace"), newline="")))
+    rows = csv.reader(io.StringIO(content.decode("utf-8", "replace"), newline=""))
+    return [[re.sub(r"^'('*[=+\-@\t\r])", r"\1", cell) for cell in row] for row in rows]  # protected from spreadsheets
 
 
 def read_csv(rows):

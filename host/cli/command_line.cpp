@@ -22,6 +22,9 @@ namespace {
 // Default memory limit of a plug-in process: more than any diagnostic needs, less than a bench machine has.
 constexpr std::uint64_t kMebibyte = std::uint64_t{1024} * 1024;
 constexpr std::uint64_t kDefaultMebibytes = 4096;
+// The largest limits on a diagnostic's log, other than none. A larger number is more likely a mistake.
+constexpr std::uint64_t kMaxLogLines = 1'000'000'000;
+constexpr std::uint64_t kMaxLogMebibytes = 1'048'576;
 
 // Arguments as CLI11 collects them, before validation.
 struct RawOptions {
@@ -44,6 +47,7 @@ struct RawOptions {
   std::string memory;
   std::string grace;
   std::string logLevel;
+  std::string logLimit;
   std::string format = "text";
   bool all = false;
   bool realTime = false;
@@ -87,8 +91,8 @@ void removeMarks(RawOptions& raw) {
                                           &raw.parameterFiles, &raw.records, &raw.outputs, &raw.deadlines}) {
     std::for_each(texts->begin(), texts->end(), removeMark);
   }
-  for (std::string* text :
-       {&raw.profile, &raw.phone, &raw.record, &raw.of, &raw.seed, &raw.seeds, &raw.memory, &raw.grace}) {
+  for (std::string* text : {&raw.profile, &raw.phone, &raw.record, &raw.of, &raw.seed, &raw.seeds, &raw.memory,
+                            &raw.logLimit, &raw.grace}) {
     removeMark(*text);
   }
 }
@@ -168,6 +172,11 @@ void addLogOptions(CLI::App& command, RawOptions& raw) {
                   "reports. Without this option, errors are printed and reports include default")
       ->type_name("LEVEL")
       ->check(CLI::IsMember({"error", "default", "debug"}));
+  command
+      .add_option("--log-limit", raw.logLimit,
+                  "Keep at most this many log lines of each diagnostic, and this much of their text; the number of "
+                  "lines left out is logged at its end. Default 1000000,64")
+      ->type_name("LINES[,MEBIBYTES]|none");
   command.add_flag("--system-log", raw.systemLog,
                    "Also send log lines to the systemd journal, or to syslog if there is no journal");
 }
@@ -212,6 +221,17 @@ std::optional<std::uint64_t> memoryOf(const std::string& text) {
 #else
   return kDefaultMebibytes * kMebibyte;
 #endif
+}
+
+LogLimit logLimitOf(const std::string& text) {
+  LogLimit limit;
+  if (text.empty()) return limit;
+  if (text == "none") return LogLimit::none();
+  const std::size_t comma = text.find(',');
+  limit.lines = parseWhole("--log-limit: LINES", text.substr(0, comma), 1, kMaxLogLines);
+  if (comma == std::string::npos) return limit;
+  limit.bytes = parseWhole("--log-limit: MEBIBYTES", text.substr(comma + 1), 1, kMaxLogMebibytes) * kMebibyte;
+  return limit;
 }
 
 std::optional<LogLevel> logLevelOf(const std::string& text) {
@@ -286,7 +306,7 @@ void checkNames(const Options& options, const std::string& what) {
 
 Options optionsOf(const CLI::App& command, const RawOptions& raw) {
   for (const char* option : {"--plugin", "--output", "--profile", "--parameters", "--phone", "--record", "--of",
-                             "RECORD", "--memory", "--grace"}) {
+                             "RECORD", "--memory", "--log-limit", "--grace"}) {
     refuseEmpty(command, option);
   }
   Options options;
@@ -311,6 +331,7 @@ Options optionsOf(const CLI::App& command, const RawOptions& raw) {
   for (const std::string& text : raw.deadlines) options.deadlines.push_back(parseDeadline(text));
   if (!raw.grace.empty()) options.grace = parseGrace(raw.grace);
   options.logLevel = logLevelOf(raw.logLevel);
+  options.logLimit = logLimitOf(raw.logLimit);
   options.systemLog = raw.systemLog;
   if (command.get_option_no_throw("--tag") != nullptr) options.tags = tagsOf(raw.tags);
   const bool isOfRun = options.command == Command::kRun || options.command == Command::kExperiment ||

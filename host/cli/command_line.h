@@ -8,6 +8,7 @@
 #include "host/plugin/profile.h"
 #include "host/report/run_report.h"
 #include "host/run/deadlines.h"
+#include "host/run/log_limit.h"
 
 #include <chrono>
 #include <cstdint>
@@ -61,6 +62,7 @@ struct Options {
   std::uint64_t seed = 0;
   std::uint64_t seeds = 0;  // the number of seeds, starting at 0
   std::optional<LogLevel> logLevel;
+  LogLimit logLimit;  // of each diagnostic
   Command command = Command::kList;
   bool all = false;
   bool onlyFailed = false;

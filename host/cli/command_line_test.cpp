@@ -63,6 +63,8 @@ TEST(ParseCommandLine, KnowsItsDefaults) {
 #if !defined(QUAZOR_ADDRESS_SANITIZER) && !defined(QUAZOR_THREAD_SANITIZER)
   EXPECT_EQ(options->memory, std::uint64_t{4096} * 1024 * 1024);
 #endif
+  EXPECT_EQ(options->logLimit.lines, 1'000'000U);
+  EXPECT_EQ(options->logLimit.bytes, std::uint64_t{64} * 1024 * 1024);
   EXPECT_FALSE(options->inProcess);
 }
 
@@ -104,6 +106,20 @@ TEST(ParseCommandLine, ReadsHowMuchMemoryThereIs) {
   EXPECT_EQ(parse({"run", "A", "--memory", "none"}).options->memory, std::nullopt);
   EXPECT_EQ(parse({"list", "--memory", "1"}).options->memory, std::uint64_t{1024} * 1024);
   EXPECT_EQ(parse({"run", "A", "--memory", "17592186044415"}).options->memory, UINT64_MAX - 1024 * 1024 + 1);
+}
+
+TEST(ParseCommandLine, ReadsHowMuchOfTheLogIsKept) {
+  const auto limitOf = [](const std::string& text) {
+    return parse({"run", "A", "--log-limit", text}).options->logLimit;
+  };
+  EXPECT_EQ(limitOf("none").lines, UINT64_MAX);
+  EXPECT_EQ(limitOf("none").bytes, UINT64_MAX);
+  EXPECT_EQ(limitOf("5").lines, 5U);
+  EXPECT_EQ(limitOf("5").bytes, LogLimit().bytes);
+  EXPECT_EQ(limitOf("1000000000,1048576").lines, 1'000'000'000U);
+  EXPECT_EQ(limitOf("1000000000,1048576").bytes, std::uint64_t{1} << 40U);
+  EXPECT_EQ(parse({"analyze", "r", "--log-limit", "7"}).options->logLimit.lines, 7U);
+  EXPECT_EQ(parse({"experiment", "E", "--log-limit", "7"}).options->logLimit.lines, 7U);
 }
 
 TEST(ParseCommandLine, ReadsTheOptionsOfRecords) {
@@ -246,6 +262,19 @@ TEST(ParseCommandLine, RefusesWrongUsage) {
       {{"run", "A", "--memory", "0"}, "--memory '0': expected an integer from 1 to 17592186044415"},
       {{"run", "A", "--memory", "17592186044416"}, "--memory '17592186044416'"},
       {{"run", "A", "--memory", "much"}, "--memory 'much'"},
+      {{"run", "A", "--log-limit", ""}, "--log-limit: the value is empty"},
+      {{"run", "A", "--log-limit", "0"}, "--log-limit: LINES '0': expected an integer from 1 to 1000000000"},
+      {{"run", "A", "--log-limit", "1000000001"}, "--log-limit: LINES '1000000001': expected an integer from 1 to"},
+      {{"run", "A", "--log-limit", "99999999999999999999"}, "--log-limit: LINES '99999999999999999999': expected"},
+      {{"run", "A", "--log-limit", "-1"}, "--log-limit: LINES '-1': expected"},
+      {{"run", "A", "--log-limit", "1e6"}, "--log-limit: LINES '1e6': expected"},
+      {{"run", "A", "--log-limit", "None"}, "--log-limit: LINES 'None': expected"},
+      {{"run", "A", "--log-limit", ",5"}, "--log-limit: LINES '': expected"},
+      {{"run", "A", "--log-limit", "5,"}, "--log-limit: MEBIBYTES '': expected an integer from 1 to 1048576"},
+      {{"run", "A", "--log-limit", "5,0"}, "--log-limit: MEBIBYTES '0': expected"},
+      {{"run", "A", "--log-limit", "5,1048577"}, "--log-limit: MEBIBYTES '1048577': expected"},
+      {{"run", "A", "--log-limit", "5,6,7"}, "--log-limit: MEBIBYTES '6,7': expected"},
+      {{"list", "--log-limit", "5"}, "--log-limit"},
       {{"run", "A", "--deadline", "soon"}, "--deadline 'soon': 'soon' is not a number"},
       {{"run", "A", "--deadline", "runn=5"}, "unknown stage 'runn'"},
       {{"run", "--only", "passed"}, "--only: passed not in {failed}"},

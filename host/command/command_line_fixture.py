@@ -93,3 +93,27 @@ class CommandLineTest(unittest.TestCase):
         self.assertEqual(result.stdout, "")
         self.assertFalse(self.output.exists())
         self.assertEqual([path.name for path in self.directory.glob("*.tmp")], [])
+
+
+def analyze(record, *arguments, **options):
+    """Analyzes a record of the fake diagnostic, whose plug-in is not installed."""
+    return quazor("analyze", record, "--plugin", WORKING, *arguments, **options)
+
+
+class RecordTest(CommandLineTest):
+    def setUp(self):
+        super().setUp()
+        self.record = self.directory / "run.jsonl"
+
+    def recorded(self, *arguments, code=0, record=None, **options):
+        """Returns a record of a run of the fake diagnostic."""
+        record = record or self.record
+        result = self.run_fake("--record", record, *arguments, **options)
+        self.assertEqual(result.returncode, code, result.stderr)
+        return record
+
+    def changed(self, change):
+        """Writes a copy of the record with changed events."""
+        events = events_in(self.record)
+        change(events)
+        return self.write("changed.jsonl", "".join(json.dumps(event) + "\n" for event in events))

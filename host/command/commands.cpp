@@ -107,7 +107,9 @@ void writeOutput(const ReportOptions& report, Console& console, const std::strin
   writeOutputFile(report.output, output);
 }
 
-ExitCode runProgram(const std::vector<std::string>& arguments, const Installation& installation, Console& console) {
+namespace {
+
+ExitCode runArguments(const std::vector<std::string>& arguments, const Installation& installation, Console& console) {
   if (!arguments.empty() && arguments.front() == kCompletionRequest) {
     for (const std::string& one : completionsOf({arguments.begin() + 1, arguments.end()}, installation)) {
       console.out << one << '\n';
@@ -128,6 +130,16 @@ ExitCode runProgram(const std::vector<std::string>& arguments, const Installatio
   } catch (const InputError& error) {  // from reading a file
     return refused(error, ExitCode::kCannotRead);
   }
+}
+
+}  // namespace
+
+ExitCode runProgram(const std::vector<std::string>& arguments, const Installation& installation, Console& console) {
+  const ExitCode code = runArguments(arguments, installation, console);
+  // These two were told already, with the reason.
+  if (console.out.flush() || code == ExitCode::kCannotWrite || code == ExitCode::kInterrupted) return code;
+  console.err << "quazor: standard output cannot be written\n";
+  return ExitCode::kCannotWrite;
 }
 
 }  // namespace quazor

@@ -1,9 +1,13 @@
 #include "host/command/failed_only.h"
 
+#include "host/command/selection.h"
 #include "host/device/phone.h"
 #include "host/model/limit_check.h"
 #include "host/record/previous_run.h"
 #include "host/record/record_file.h"
+
+#include <sys/stat.h>
+#include <unistd.h>
 
 #include <algorithm>
 #include <utility>
@@ -69,9 +73,21 @@ void refuseOnlyLimits(const RecordedRun& run) {
   }
 }
 
+// True for the record that quazor wrote for this user.
+bool isOwn(const std::filesystem::path& record, const Options& options) {
+  struct stat status {};
+  return options.failedOf.empty() && ::stat(record.c_str(), &status) == 0 && status.st_uid == ::geteuid();
+}
+
+std::vector<std::filesystem::path> pluginsToLoadAgain(const RecordedRun& run, bool own,
+                                                      const Installation& installation) {
+  if (!own) return recordedPlugins(run.began.plugins, installation);
+  return {run.began.plugins.begin(), run.began.plugins.end()};
+}
+
 }  // namespace
 
-Options optionsToRunAgain(Options options) {
+Options optionsToRunAgain(Options options, const Installation& installation) {
   const std::filesystem::path record = options.failedOf.empty() ? previousRunFile() : options.failedOf;
   if (record.empty() || (options.failedOf.empty() && !std::filesystem::exists(record))) {
     throw CommandError(ExitCode::kCannotRead, "no previous run is recorded; use --of RECORD to name a record");
@@ -82,7 +98,7 @@ Options optionsToRunAgain(Options options) {
   if (options.names.empty()) refuseOnlyLimits(run);
   options.recorded = recordedProfile(record, run, options.names);
   options.recorded->limits = limitsOfFailed(run, options.names);
-  if (options.plugins.empty()) options.plugins.assign(run.began.plugins.begin(), run.began.plugins.end());
+  if (options.plugins.empty()) options.plugins = pluginsToLoadAgain(run, isOwn(record, options), installation);
   if (options.phone.empty()) {
     options.phone = run.began.phone;
     if (bindingNamed(options.phone) && (options.realTime || options.seed != 0)) {

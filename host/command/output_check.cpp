@@ -28,7 +28,11 @@ bool isSameFile(const fs::path& a, const fs::path& b) {
   if (isFirst && isSecond) return first.st_dev == second.st_dev && first.st_ino == second.st_ino;
   if (isFirst || isSecond) return false;
   std::error_code error;
-  return fs::weakly_canonical(fs::absolute(a), error) == fs::weakly_canonical(fs::absolute(b), error);
+  const auto placeOf = [&error](const fs::path& file) {
+    const fs::path absolute = fs::absolute(file, error);  // fails where the working folder was deleted
+    return fs::weakly_canonical(error ? file : absolute, error);
+  };
+  return placeOf(a) == placeOf(b);
 }
 
 // Devices and pipes may be written by several, and are no input that a run could damage.

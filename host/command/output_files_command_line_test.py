@@ -1,10 +1,14 @@
 """Files of a run: outputs that would overwrite what it reads, a record that another host is writing, names of formats."""
 
 import fcntl
+import json
 import pathlib
+import subprocess
 import unittest
 
-from command_line_fixture import WORKING, CommandLineTest, quazor
+from command_line_fixture import PROGRAM, WORKING, CommandLineTest, quazor
+
+PLUGIN = ("--plugin", WORKING)
 
 
 class OutputFilesTest(CommandLineTest):
@@ -27,9 +31,9 @@ class OutputFilesTest(CommandLineTest):
         for name in (self.record, symbolic, hard, f"{self.directory}/./run.jsonl"):
             for option in (["--record", name], ["--output", name], ["--output", f"json:{name}"]):
                 with self.subTest(option):
-                    self.assert_untouched(self.record, quazor("analyze", self.record, *option))
-                    self.assert_untouched(self.record, quazor("run", "--only", "failed", "--of", self.record, *option))
-        self.assert_untouched(self.record, quazor("analyze", hard, "--record", symbolic))
+                    self.assert_untouched(self.record, quazor("analyze", self.record, *PLUGIN, *option))
+                    self.assert_untouched(self.record, quazor("run", "--only", "failed", "--of", self.record, *PLUGIN, *option))
+        self.assert_untouched(self.record, quazor("analyze", hard, *PLUGIN, "--record", symbolic))
 
     def test_the_phone_the_profile_the_parameters_and_the_plug_in(self):
         profile = self.write("profile.json", '{"schema": 1, "entries": []}')
@@ -53,6 +57,64 @@ class OutputFilesTest(CommandLineTest):
         self.before[last] = last.read_bytes()
         self.assert_untouched(last, self.run_fake("--record", last, env=state))
         self.assert_untouched(last, self.run_fake("--output", f"json:{last}", env=state))
+
+    def test_what_a_killed_host_left_behind_is_removed(self):
+        left = [self.directory / f".{name}.quazor-1.tmp" for name in ("run.jsonl", "out.json")]
+        for file in left:
+            file.write_text("half a")
+        result = self.run_fake("--record", self.record, "--format", "json", "--output", self.output)
+        self.assertEqual(result.returncode, 0, result.stderr)
+        self.assertEqual([file for file in left if file.exists()], [])
+
+    def test_a_link_where_the_record_of_the_last_run_belongs_is_not_followed(self):
+        precious = self.write("precious", "precious")
+        state = self.directory / "state/quazor"
+        state.mkdir(parents=True)
+        last = state / "last_run.jsonl"
+        last.symlink_to(precious)
+        result = self.run_fake(env={"XDG_STATE_HOME": str(state.parent)})
+        self.assertEqual(result.returncode, 0, result.stderr)
+        self.assertEqual(precious.read_text(), "precious")
+        self.assertFalse(last.is_symlink())
+        self.assert_verifies(last)
+
+    def test_standard_output_as_a_file(self):
+        for name in ("/dev/stdout", "/dev/fd/1", "/proc/self/fd/1"):
+            with self.subTest(name):
+                out = self.write("out.txt", "before\n")
+                with open(out, "a", encoding="utf-8") as stream:
+                    result = self.run_fake("--format", "json", "--output", name, stdout=stream)
+                self.assertEqual(result.returncode, 0, result.stderr)
+                text = out.read_text()
+                self.assertTrue(text.startswith("before\n"), text)
+                self.assertIn("Fake.One", text[:text.index("{")])  # the verdict
+                self.assertEqual(json.loads(text[text.index("{"):])["diagnostics"][0]["name"], "Fake.One")
+
+    def test_a_working_folder_that_was_deleted(self):
+        folder = self.directory / "deleted"
+        deleted = ["sh", "-c", 'cd "$0" && rmdir "$0" && exec "$@"', folder, PROGRAM]
+        for arguments, code, text in (
+                (["run", "Fake.One", *PLUGIN, "--phone", self.phone, "--profile", "none", "--set", "duration=1"], 0, ""),
+                (["list"], 0, ""),
+                (["list", "--plugin", "x.so"], 66, "the plug-in 'x.so' does not exist"),
+                (["run", "--all", "--phone", "phone.json"], 66, "phone.json"),
+                (["run", "--all", "--output", "out"], 73, "the output file 'out' cannot be written: No such file"),
+                (["run", "--all", "--record", "run"], 73, "the record 'run' cannot be written: No such file"),
+                (["run", "--all", "--record", "a", "--output", "b"], 73, "cannot be written: No such file"),
+                (["verify", "run"], 66, "the record 'run' cannot be read: No such file")):
+            with self.subTest(arguments):
+                folder.mkdir()
+                result = subprocess.run([*deleted, *arguments], capture_output=True, text=True, check=False, timeout=120)
+                self.assertEqual(result.returncode, code, result.stderr)
+                self.assertIn(text, result.stderr)
+
+    def test_texts_on_a_full_disk(self):
+        for arguments in (["--help"], ["run", "--help"], ["--version"], ["list"], ["doctor"], ["explain"],
+                          ["completion", "bash"], ["__complete", "ru"], ["verify", self.record]):
+            with self.subTest(arguments), open("/dev/full", "w", encoding="utf-8") as full:
+                result = quazor(*arguments, stdout=full)
+                self.assertEqual(result.returncode, 73, result.stderr)
+                self.assertEqual(result.stderr, "quazor: standard output cannot be written\n")
 
     def test_a_record_that_another_host_is_writing(self):
         with open(self.record, "rb") as busy:

@@ -4,6 +4,7 @@ import json
 import os
 import pathlib
 import resource
+import shutil
 import signal
 import time
 import unittest
@@ -128,6 +129,23 @@ class ProcessTest(CommandLineTest):
     def test_as_much_memory_as_there_is(self):
         self.assertEqual(self.run_fake("--memory", "none").returncode, 0)
 
+    def test_no_more_of_the_log_is_kept_than_the_limit_says(self):
+        for arguments in ([], ["--in-process"]):
+            with self.subTest(arguments):
+                record = self.directory / "run.jsonl"
+                result = self.run_fake("--log-limit", "1", "--record", record, "--log-level", "debug", *arguments)
+                self.assertEqual(result.returncode, 0, result.stderr)
+                texts = [event["text"] for event in events_in(record) if event["event"] == "log"]
+                self.assertEqual(len(texts), 2, texts)
+                self.assertRegex(texts[1], r"^[0-9]+ more log lines were left out \(--log-limit\)$")
+                self.assertIn(texts[1], result.stderr)
+                self.assert_verifies(record)
+
+    def test_log_limits_that_are_refused(self):
+        for text in ("0", "-1", "1.5", "many", "1000000001", "5,0", "5,1048577"):
+            with self.subTest(text):
+                self.assert_refused(self.run_fake("--log-limit", text), 64, "--log-limit: ", "expected an integer from 1 to")
+
     def test_in_process_and_isolated_runs_report_the_same(self):
         for arguments, code in ((["--set", "measured=3"], 0), (["--set", "minimum=1"], 1),
                                 (["--set", "experiment.behaviour=5"], 2), (["--set", "experiment.behaviour=9"], 2)):
@@ -217,6 +235,60 @@ class ProcessTest(CommandLineTest):
                 self.assertEqual([event["sequence"] for event in events_in(record)][0], 0)
                 self.assert_verifies(record)
                 self.assertEqual(result.returncode, code, result.stdout + result.stderr)
+
+
+class TrustTest(CommandLineTest):
+    """Plug-ins that others than the user may change."""
+
+    def setUp(self):
+        super().setUp()
+        folder = self.directory / "plugins"
+        folder.mkdir(0o755)
+        self.plugin = folder / "working_plugin.so"
+        shutil.copy(WORKING, self.plugin)
+        self.plugin.chmod(0o644)
+
+    def run_copy(self, command, *arguments):
+        return quazor(*command, "--plugin", self.plugin, *arguments)
+
+    def test_they_are_refused_by_every_command_that_loads_plug_ins(self):
+        self.assertEqual(self.run_copy(["list"]).returncode, 0)
+        self.plugin.chmod(0o664)
+        for command in (["list"], ["describe", "Fake.One"], ["run", "Fake.One"], ["run", "--all", "--in-process"],
+                        ["experiment", "--all"], ["selftest"]):
+            with self.subTest(command):
+                self.assert_refused(self.run_copy(command), 66,
+                                    f"the plug-in '{self.plugin}' may be changed by others: its group may write to "
+                                    f"'{self.plugin}' (mode 0664); this ends it: chmod g-w '{self.plugin}'")
+
+    def test_the_check_comes_before_the_load(self):
+        fatal = self.directory / "plugins/fatal_plugin.so"  # loading it ends the process
+        shutil.copy(FATAL, fatal)
+        fatal.chmod(0o666)
+        result = quazor("list", "--in-process", "--plugin", fatal)
+        self.assert_refused(result, 66, "everybody may write to")
+
+    def test_so_are_those_in_a_folder_that_others_may_write(self):
+        for mode, refused in ((0o775, True), (0o757, True), (0o1777, False), (0o755, False)):
+            with self.subTest(mode):
+                self.plugin.parent.chmod(mode)
+                result = self.run_copy(["list"])
+                if refused:
+                    self.assert_refused(result, 66, f"'{self.plugin.parent}' (mode {mode:04o})")
+                else:
+                    self.assertEqual(result.returncode, 0, result.stderr)
+
+    @unittest.skipUnless(os.geteuid() == 0, "only root can make a file another's")
+    def test_so_are_those_of_another_user(self):
+        os.chown(self.plugin, 54321, 54321)
+        self.assert_refused(self.run_copy(["list"]), 66, f"'{self.plugin}' belongs to user 54321, who is neither root")
+
+    def test_the_doctor_tells_it(self):
+        self.plugin.chmod(0o666)
+        result = self.run_copy(["doctor"])
+        self.assertEqual(result.returncode, 66)
+        self.assertIn(f"REFUSED  plug-in {self.plugin}", result.stdout)
+        self.assertIn("everybody may write to", result.stdout)
 
 
 class InterruptTest(CommandLineTest):

@@ -1,32 +1,14 @@
-"""Records: written, verified, analyzed again, compared, and used for another run."""
+"""Records: written, verified, compared, and used for another run."""
 
 import json
 import pathlib
 import random
+import re
 import resource
 import unittest
 import xml.etree.ElementTree
 
-from command_line_fixture import EXPERIMENTS, PLUGINS, WORKING, CommandLineTest, events_in, quazor
-
-
-class RecordTest(CommandLineTest):
-    def setUp(self):
-        super().setUp()
-        self.record = self.directory / "run.jsonl"
-
-    def recorded(self, *arguments, code=0, record=None, **options):
-        """Returns a record of a run of the fake diagnostic."""
-        record = record or self.record
-        result = self.run_fake("--record", record, *arguments, **options)
-        self.assertEqual(result.returncode, code, result.stderr)
-        return record
-
-    def changed(self, change):
-        """Writes a copy of the record with changed events."""
-        events = events_in(self.record)
-        change(events)
-        return self.write("changed.jsonl", "".join(json.dumps(event) + "\n" for event in events))
+from command_line_fixture import EXPERIMENTS, PLUGINS, WORKING, RecordTest, analyze, events_in, quazor
 
 
 class MakingTest(RecordTest):
@@ -192,6 +174,25 @@ class VerifyTest(RecordTest):
                 self.assertEqual(result.returncode, 3, result.stderr)
                 self.assertIn("The record is incomplete: the run did not end", result.stdout)
 
+    def test_what_follows_the_end_is_wrong_also_if_it_is_cut_off(self):
+        text = self.record.read_text()
+        for tail in ("{", '{"sequence":', "\0" * 100, text.splitlines()[1]):
+            with self.subTest(tail[:10]):
+                record = self.write("tail.jsonl", text + tail)
+                result = quazor("verify", record)
+                self.assertEqual(result.returncode, 1, result.stdout)
+                self.assertTrue(result.stdout.startswith("WRONG  an incomplete line follows the end of the run\n"), result.stdout)
+        count = len(text.splitlines())
+        self.assert_wrong(self.write("tail.jsonl", text + text.splitlines(keepends=True)[1]),
+                          f"line {count + 1}: the sequence number is 1 instead of {count}; a line is missing or has been moved")
+
+    def test_dates_that_no_clock_can_have(self):
+        line = self.record.read_text().splitlines(keepends=True)[0]
+        for year in ("2262", "9999", "1677", "0000"):
+            with self.subTest(year):
+                record = self.write("date.jsonl", re.sub(r'"date":"[0-9]{4}', f'"date":"{year}', line))
+                self.assert_wrong(record, 'line 1: "date" is not a timestamp of the years 1678 to 2261')
+
     def test_values_in_many_levels_do_not_crash_it(self):
         deep = '{"array":[' * 100_000 + "]}" * 100_000
         line = '{"sequence":1,"event":"collected","key":"k","value":' + deep + "}\n"
@@ -221,107 +222,6 @@ class VerifyTest(RecordTest):
                 self.assertIn("standard output cannot be written", result.stderr)
 
 
-class AnalyzeTest(RecordTest):
-    def setUp(self):
-        super().setUp()
-        self.recorded("--set", "measured=90", "--set", "minimum=90", names=["Fake.*"])
-
-    def test_it_comes_to_the_same_verdict(self):
-        result = quazor("analyze", self.record)
-        self.assertEqual(result.returncode, 0, result.stderr)
-        self.assertTrue(result.stdout.endswith("2 diagnostics: 2 passed, 0 failed, 0 ended in an error\n"))
-
-    def test_it_takes_new_parameters_and_the_recorded_ones(self):
-        for arguments in (["--set", "minimum=91"], ["--set", "analysis.minimum=91"]):
-            result = quazor("analyze", self.record, *arguments, "--format", "json")
-            self.assertEqual(result.returncode, 1, result.stderr)
-            for record in json.loads(result.stdout)["diagnostics"]:
-                self.assertEqual(record["parameters"], {"experiment": {"duration": 1, "measured": 90},
-                                                        "analysis": {"minimum": 91}})
-                self.assertEqual(record["measuredResults"][0]["limit"]["lower"]["value"], 91.0)
-        record = self.directory / "again.jsonl"
-        self.assertEqual(quazor("analyze", self.record, "--record", record).returncode, 0)
-        parameter, _ = events_in(record)[1]["parameters"]["analysis"]
-        self.assertEqual(parameter["source"], "command line, in the record")
-
-    def test_its_record_can_be_verified_and_analyzed_again(self):
-        record = self.directory / "again.jsonl"
-        self.assertEqual(quazor("analyze", self.record, "--set", "minimum=91", "--record", record).returncode, 1)
-        self.assert_verifies(record)
-        self.assertEqual(quazor("analyze", record).returncode, 1)
-        self.assertEqual(quazor("analyze", record, "--set", "minimum=90").returncode, 0)
-
-    def test_an_error_in_the_analysis(self):
-        result = quazor("analyze", self.record, "--set", "behaviour=22")
-        self.assertEqual(result.returncode, 2)
-        self.assertIn("FakeDomain code 6: analyzing failed", result.stdout)
-
-    def test_what_has_no_result_is_left_out(self):
-        self.recorded("--set", "duration=1", code=2, names=["Fake.One", "Broken.Nothing"], duration=None)
-        result = quazor("analyze", self.record)
-        self.assertEqual(result.returncode, 0, result.stderr)
-        self.assertIn("Broken.Nothing has no experiment result in the record and is skipped", result.stderr)
-
-    def test_in_this_process(self):
-        result = quazor("analyze", self.record, "--in-process")
-        self.assertEqual(result.returncode, 0, result.stderr)
-
-    def test_what_is_refused(self):
-        self.assert_refused(quazor("analyze", self.directory / "missing"), 66, "cannot be read")
-        self.assert_refused(quazor("analyze"), 64, "RECORD")
-        self.assert_refused(quazor("analyze", self.record, "--set", "minimun=1"), 64, "did you mean 'minimum'?")
-        self.assert_refused(quazor("analyze", self.record, "--set", "measured=1"), 64,
-                            "no analysis of the selected diagnostics has a parameter 'measured'")
-        self.assert_refused(quazor("analyze", self.record, "--set", "experiment.duration=1"), 64,
-                            "--set 'experiment.duration=1': 'quazor analyze' does not run experiments")
-        self.assert_refused(quazor("analyze", self.record, "--plugin", EXPERIMENTS), 64, "there is no diagnostic")
-        self.assert_refused(quazor("analyze", self.record, "--realtime"), 64, "--realtime")
-        self.assert_refused(quazor("analyze", self.record, "--plugin", self.directory / "no.so"), 66, "does not exist")
-
-    def test_a_record_without_results_is_refused(self):
-        self.recorded(code=2, names=["Broken.Nothing"], duration=None)
-        result = quazor("analyze", self.record)
-        self.assertEqual(result.returncode, 66)
-        self.assertIn("contains no experiment result to analyze", result.stderr)
-
-
-class EarlierRecordTest(RecordTest):
-    """Records that spell the stage analyze as `analyse`."""
-
-    def setUp(self):
-        super().setUp()
-        self.recorded("--set", "measured=90", "--set", "minimum=90")
-        self.earlier = self.changed(self.rename)
-
-    @staticmethod
-    def rename(events):
-        analyses = [event for event in events if event.get("stage") == "analyze"]
-        assert len(analyses) >= 2
-        for event in analyses:
-            event["stage"] = "analyse"
-
-    def test_it_verifies(self):
-        self.assert_verifies(self.earlier)
-
-    def test_it_can_be_analyzed_again(self):
-        result = quazor("analyze", self.earlier, "--set", "minimum=91", "--record", self.directory / "again.jsonl")
-        self.assertEqual(result.returncode, 1, result.stderr)
-        stages = {event["stage"] for event in events_in(self.directory / "again.jsonl") if "stage" in event}
-        self.assertIn("analyze", stages)
-        self.assertNotIn("analyse", stages)
-
-    def test_it_does_not_differ_from_a_record_of_today(self):
-        result = quazor("diff", self.earlier, self.record)
-        self.assertEqual((result.returncode, result.stdout), (0, "The records do not differ.\n"))
-
-    def test_where_an_error_came_from_is_read(self):
-        self.recorded("--set", "analysis.behaviour=22", code=2)
-        failing = self.changed(self.rename)
-        self.assert_verifies(failing)
-        result = quazor("diff", failing, self.record)
-        self.assertEqual((result.returncode, result.stdout), (0, "The records do not differ.\n"))
-
-
 class DiffTest(RecordTest):
     def test_two_runs_with_one_seed_tell_the_same(self):
         first = self.recorded("--set", "measured=90", names=["Fake.*"])
@@ -346,7 +246,7 @@ class DiffTest(RecordTest):
     def test_an_analysis_differs_only_in_what_it_makes_of_the_result(self):
         first = self.recorded("--set", "measured=90")
         second = self.directory / "second.jsonl"
-        quazor("analyze", first, "--record", second)
+        analyze(first, "--record", second)
         result = quazor("diff", first, second)
         self.assertEqual((result.returncode, result.stdout), (0, "The records do not differ.\n"))
 
@@ -430,7 +330,7 @@ class OnlyFailedTest(RecordTest):
     def test_experiments_and_analyses_are_no_last_run(self):
         self.recorded("--set", "minimum=1", code=1)
         self.run_names("Broken.Nothing", code=2)
-        quazor("analyze", self.record, env=self.state)
+        analyze(self.record, env=self.state)
         quazor("experiment", "FakeExperiment", "--plugin", WORKING, "--profile", "none", "--set", "duration=1",
                "--phone", self.phone, env=self.state)
         result = self.only_failed("--format", "json")

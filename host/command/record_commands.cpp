@@ -22,13 +22,14 @@ ExitCode verifyRecord(const std::filesystem::path& file, std::ostream& answer) {
     answer << "WRONG  " << printable(defect.what()) << '\n';
     return ExitCode::kFailed;
   }
-  const std::vector<std::string> problems = problemsOf(stored.events);
+  std::vector<std::string> problems = problemsOf(stored.events);
+  const bool complete = std::holds_alternative<RunEnded>(stored.events.back());
+  if (complete && stored.cutOff) problems.emplace_back("an incomplete line follows the end of the run");
   for (const std::string& problem : problems) answer << "WRONG  " << printable(problem) << '\n';
   const auto verdicts =
       static_cast<std::size_t>(std::count_if(stored.events.begin(), stored.events.end(), [](const RunEvent& event) {
         return std::holds_alternative<DiagnosticEnded>(event);
       }));
-  const bool complete = std::holds_alternative<RunEnded>(stored.events.back());
   answer << countText(stored.events.size(), "event") << ", " << countText(verdicts, "verdict") << ", "
          << countText(problems.size(), "problem") << '\n';
   if (!complete) {

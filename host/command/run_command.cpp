@@ -107,7 +107,7 @@ RunStarted beginningOf(const Options& options, const Installation& installation,
 }
 
 EventPipelineOptions eventOptions(const Options& options, bool keepsLastRun) {
-  return {options.record, keepsLastRun, options.systemLog, options.report};
+  return {options.record, keepsLastRun, options.systemLog, options.report, options.logLimit};
 }
 
 ExitCode perform(const Options& options, const Installation& installation, Console& console, RunStarted began,
@@ -169,7 +169,7 @@ std::string choosePhone(const Options& options, const Installation& installation
 }  // namespace
 
 ExitCode runCommand(const Options& given, const Installation& installation, Console& console, WatchedSignals* signals) {
-  const Options options = given.onlyFailed ? optionsToRunAgain(given) : given;
+  const Options options = given.onlyFailed ? optionsToRunAgain(given, installation) : given;
   if (options.onlyFailed && options.names.empty()) return performNothing(options, installation, console);
   Selection selection = select(options, installation, signals);
   std::vector<Job> jobs;
@@ -180,6 +180,7 @@ ExitCode runCommand(const Options& given, const Installation& installation, Cons
   RunOptions runOptions;
   const std::string phone = choosePhone(options, installation, &runOptions.makePhone);
   runOptions.logLevel = options.logLevel.value_or(LogLevel::kDefault);
+  runOptions.logLimit = options.logLimit;
   RunStarted began = beginningOf(options, installation, jobs, selection.failed);
   began.phone = phone;
   began.limits = std::move(selection.limits);
@@ -231,7 +232,7 @@ ExitCode analyzeCommand(const Options& given, const Installation& installation, 
     throw CommandError(ExitCode::kCannotRead,
                        "the record '" + given.records.front().string() + "' contains no experiment result to analyze");
   }
-  if (options.plugins.empty()) options.plugins.assign(run.began.plugins.begin(), run.began.plugins.end());
+  if (options.plugins.empty()) options.plugins = recordedPlugins(run.began.plugins, installation);
   const Selection selection = select(options, installation, signals);
   std::vector<QZExperimentResult> results(analysable.size());
   std::vector<Job> jobs;
@@ -246,6 +247,7 @@ ExitCode analyzeCommand(const Options& given, const Installation& installation, 
   }
   RunOptions runOptions;
   runOptions.logLevel = options.logLevel.value_or(LogLevel::kDefault);
+  runOptions.logLimit = options.logLimit;
   RunStarted began = beginningOf(options, installation, jobs, selection.failed);
   began.phone = run.began.phone;
   began.seed = run.began.seed;

@@ -1,10 +1,12 @@
 #include "host/command/selection.h"
 
 #include "host/plugin/plugin_loader.h"
+#include "host/plugin/plugin_trust.h"
 #include "host/plugin/profile.h"
 
 #include <algorithm>
 #include <optional>
+#include <system_error>
 #include <utility>
 
 namespace quazor {
@@ -77,6 +79,25 @@ void describeForProfiles(const Options& options, const Installation& installatio
 
 }  // namespace
 
+std::vector<std::filesystem::path> recordedPlugins(const std::vector<std::string>& recorded,
+                                                   const Installation& installation) {
+  const std::vector<std::filesystem::path> installed = installation.allPlugins();
+  std::vector<std::filesystem::path> plugins;
+  for (const std::string& name : recorded) {
+    const auto found = std::find_if(installed.begin(), installed.end(), [&name](const std::filesystem::path& one) {
+      std::error_code ignored;
+      return std::filesystem::equivalent(one, name, ignored);
+    });
+    if (found == installed.end()) {
+      throw CommandError(ExitCode::kCannotRead, "the record names the plug-in '" + name +
+                                                    "', which is not an installed one; to load it, name it with "
+                                                    "--plugin");
+    }
+    plugins.push_back(*found);
+  }
+  return plugins;
+}
+
 IsolationOptions isolationOf(const Options& options, const Installation& installation) {
   IsolationOptions isolation{options.plugins, options.memory, options.deadlines, options.grace};
   if (isolation.plugins.empty()) isolation.plugins.push_back(installation.defaultPlugin());
@@ -86,6 +107,7 @@ IsolationOptions isolationOf(const Options& options, const Installation& install
 PluginScan scanOf(const Options& options, const Installation& installation, const DiagnosticChoice& described,
                   WatchedSignals* signals) {
   const IsolationOptions isolation = isolationOf(options, installation);
+  requireTrustedPlugins(isolation.plugins);
   PluginScan scan;
   if (options.inProcess) {
     loadPlugins(isolation.plugins);

@@ -5,6 +5,8 @@
 #include "host/cli/installation.h"
 #include "host/run/plugin_scan.h"
 
+#include <filesystem>
+#include <string>
 #include <vector>
 
 namespace quazor {
@@ -18,9 +20,14 @@ struct Selection {
 // The plug-ins that the options name, or the installed one, and the limits of their processes.
 IsolationOptions isolationOf(const Options& options, const Installation& installation);
 
+// The installed plug-ins of a record. Anybody may have written it, so it cannot make quazor load any other file: throws
+// a CommandError (kCannotRead) that asks for --plugin.
+std::vector<std::filesystem::path> recordedPlugins(const std::vector<std::string>& recorded,
+                                                   const Installation& installation);
+
 // Scans the plug-ins in separate processes, or in this one with --in-process. `described` chooses the diagnostics that
-// are asked for their descriptions. Throws a CommandError if a plug-in cannot be loaded, and kInterrupted on an
-// interrupt. `signals` is the command's; null: they are watched during the scan only.
+// are asked for their descriptions. Throws a CommandError if a plug-in cannot be loaded or others may change it, and
+// kInterrupted on an interrupt. `signals` is the command's; null: they are watched during the scan only.
 PluginScan scanOf(const Options& options, const Installation& installation, const DiagnosticChoice& described,
                   WatchedSignals* signals = nullptr);
 

@@ -3,6 +3,7 @@
 
 #include "contract/diagnostic_error.h"
 
+#include <cfenv>
 #include <cstdint>
 #include <exception>
 #include <string>
@@ -37,10 +38,26 @@ DiagnosticErrorPtr hostError(HostErrorCode code, std::string message);
 // The error for an exception thrown by a plug-in. `operation` is the name of the operation that threw.
 DiagnosticErrorPtr errorOfException(std::string_view operation, const std::exception_ptr& thrown);
 
+// Restores the floating-point environment at its end. Code of a plug-in may leave another rounding behind, or a
+// processor that takes very small numbers for 0.
+//
+// Thread: the one that made it.
+class FloatingPointGuard {
+ public:
+  FloatingPointGuard() { std::fegetenv(&before_); }
+  FloatingPointGuard(const FloatingPointGuard&) = delete;
+  FloatingPointGuard& operator=(const FloatingPointGuard&) = delete;
+  ~FloatingPointGuard() { std::fesetenv(&before_); }
+
+ private:
+  std::fenv_t before_{};
+};
+
 // Calls into a plug-in. `call` receives an empty error variable and returns whether it succeeded. Catches all
 // exceptions. On failure `failure` is set to the error of the call, or to kNoErrorGiven if it gave none.
 template <class Call>
 bool callPlugin(std::string_view operation, DiagnosticErrorPtr* failure, Call&& call) {
+  const FloatingPointGuard guard;
   DiagnosticErrorPtr error;
   try {
     if (std::forward<Call>(call)(&error)) return true;

@@ -2,7 +2,13 @@
 
 #include <gtest/gtest.h>
 
+#include <cfenv>
+#include <limits>
 #include <stdexcept>
+
+#ifdef __SSE2__
+#include <xmmintrin.h>
+#endif
 
 namespace quazor {
 namespace {
@@ -56,6 +62,27 @@ TEST(CallPlugin, StopsWhateverIsThrown) {
   EXPECT_EQ(failure->localizedDescription(), "run of X threw an exception: no memory of it");
   EXPECT_FALSE(callPlugin("run of X", &failure, [](DiagnosticErrorPtr* /*error*/) -> bool { throw "text"; }));
   EXPECT_EQ(failure->localizedDescription(), "run of X threw something that is not a standard exception");
+}
+
+TEST(CallPlugin, RestoresTheFloatingPointEnvironment) {
+  DiagnosticErrorPtr failure;
+  callPlugin("run", &failure, [](DiagnosticErrorPtr* /*error*/) { return std::fesetround(FE_UPWARD) == 0; });
+  EXPECT_EQ(std::fegetround(), FE_TONEAREST);
+  callPlugin("run", &failure, [](DiagnosticErrorPtr* /*error*/) -> bool {
+    std::fesetround(FE_DOWNWARD);
+    throw std::runtime_error("the lamp is out");
+  });
+  EXPECT_EQ(std::fegetround(), FE_TONEAREST);
+#ifdef __SSE2__
+  constexpr unsigned kFlushToZero = 0x8040;  // the two bits of MXCSR, for results and operands
+  callPlugin("run", &failure, [](DiagnosticErrorPtr* /*error*/) {
+    _mm_setcsr(_mm_getcsr() | kFlushToZero);
+    return true;
+  });
+  EXPECT_EQ(_mm_getcsr() & kFlushToZero, 0U);
+  const volatile double small = std::numeric_limits<double>::min();
+  EXPECT_GT(small / 2, 0.0);
+#endif
 }
 
 }  // namespace

@@ -54,6 +54,7 @@ struct StageEnded {
 
 struct Logged {
   LogLine line;
+  bool isOfHost = false;  // neither stored nor sent: the host's own lines have limits of their own
 };
 
 // Some of the measurements of the experiment's result, in their order.

@@ -4,6 +4,7 @@
 #include "base/text/nearest_name.h"
 #include "contract/contract.h"
 #include "host/error/exit_code.h"
+#include "host/error/host_error.h"
 #include "host/plugin/shared_object.h"
 
 #include <dlfcn.h>
@@ -89,6 +90,7 @@ void loadPlugin(const std::filesystem::path& file) {
   const std::size_t registered = lab.registrations().size();
   const std::size_t refused = lab.refusedNames().size();
   // An absolute path contains a slash, so the linker opens this file and does not search for it.
+  const FloatingPointGuard guard;  // initializers of code that is compiled for speed change it
   if (dlopen(std::filesystem::absolute(file).c_str(), RTLD_NOW | RTLD_LOCAL) == nullptr) {
     const char* message = dlerror();
     refuseUnlinkable(message == nullptr ? "the dynamic linker gives no reason" : message);

@@ -1,6 +1,14 @@
 #include "host/plugin/plugin_loader.h"
 
+#include "host/error/exit_code.h"
+#include "host/testing/test_environment.h"
+#include "tests/support/thrown_text.h"
+
+#include <gmock/gmock.h>
 #include <gtest/gtest.h>
+
+#include <cfenv>
+#include <filesystem>
 
 namespace quazor {
 namespace {
@@ -25,6 +33,13 @@ TEST(ContractVersionIn, IsThatOfTheMissingSymbol) {
       {"no text", "", std::nullopt},
   };
   for (const Row& row : kRows) EXPECT_EQ(contractVersionIn(row.message), row.version) << row.name;
+}
+
+TEST(LoadSomePlugins, RestoresTheFloatingPointEnvironment) {
+  const EnvironmentVariable way("FATAL_PLUGIN", "round");
+  const std::filesystem::path plugin = std::filesystem::path(QUAZOR_TEST_PLUGINS) / "fatal_plugin.so";
+  EXPECT_THAT(thrownText<CommandError>([&] { loadSomePlugins({plugin}); }, ""), testing::EndsWith("registers nothing"));
+  EXPECT_EQ(std::fegetround(), FE_TONEAREST);
 }
 
 }  // namespace

@@ -7,7 +7,8 @@ namespace quazor {
 
 // Throws InputError if `file` is not a shared object; what() is the end of a sentence that begins with the file's name.
 // The dynamic linker trusts the sizes in a file's headers and crashes the process on a truncated file, so this function
-// checks them. All other checks are left to the linker.
+// checks them. It also refuses a file of another architecture, of which the linker says that it does not exist. All
+// other checks are left to the linker.
 //
 // The layout is described in elf(5).
 void validateSharedObject(const std::filesystem::path& file);

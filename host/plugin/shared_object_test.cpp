@@ -4,6 +4,7 @@
 #include "host/testing/test_directory.h"
 #include "tests/support/thrown_text.h"
 
+#include <elf.h>
 #include <gtest/gtest.h>
 #include <sys/stat.h>
 
@@ -56,11 +57,33 @@ TEST(ValidateSharedObject, DoesNotBelieveImpossibleOffsets) {
   EXPECT_EQ(problemOf(directory.write("wild.so", content)), "is a truncated shared object");
 }
 
-TEST(ValidateSharedObject, LeavesAnotherMachinesFileToTheLinker) {
+TEST(ValidateSharedObject, NamesAnotherArchitecture) {
   const TestDirectory directory;
-  std::string content = ownProgram();
-  content[4] = 1;  // ELFCLASS32
-  EXPECT_EQ(problemOf(directory.write("small.so", content)), "");
+  struct Row {
+    char size;
+    char order;
+    std::string machine;
+    const char* name;
+  };
+  const Row rows[] = {
+      {ELFCLASS64, ELFDATA2LSB, {'\x16', '\x00'}, "S/390"},
+      {ELFCLASS64, ELFDATA2MSB, {'\x00', '\x16'}, "S/390, big-endian"},
+      {ELFCLASS32, ELFDATA2LSB, {'\x28', '\x00'}, "ARM, 32 bits"},
+      {ELFCLASS64, ELFDATA2LSB, {'\x34', '\x12'}, "machine 4660"},
+#ifdef __x86_64__
+      {ELFCLASS64, ELFDATA2LSB, {'\xB7', '\x00'}, "AArch64"},
+      {ELFCLASS32, ELFDATA2LSB, {'\x3E', '\x00'}, "x86-64, 32 bits"},
+#endif
+  };
+  for (const Row& row : rows) {
+    std::string content = ownProgram();
+    content[EI_CLASS] = row.size;
+    content[EI_DATA] = row.order;
+    content.replace(18, 2, row.machine);
+    const std::string problem = problemOf(directory.write("foreign.so", content));
+    EXPECT_TRUE(problem.starts_with("is built for another architecture (" + std::string(row.name) + ") than quazor ("))
+        << problem;
+  }
 }
 
 }  // namespace

@@ -7,6 +7,7 @@
 #include "host/model/record_builder.h"
 #include "host/record/lossless_json.h"
 #include "host/record/run_event_json.h"
+#include "host/system/own_descriptor.h"
 
 #include <fcntl.h>
 #include <sys/file.h>
@@ -15,10 +16,10 @@
 
 #include <array>
 #include <cerrno>
-#include <cstdio>
 #include <cstring>
 #include <fstream>
 #include <optional>
+#include <system_error>
 #include <utility>
 
 namespace quazor {
@@ -26,8 +27,6 @@ namespace quazor {
 namespace {
 
 using Json = nlohmann::ordered_json;
-
-constexpr mode_t kMode = 0666;  // reduced by the umask
 
 [[noreturn]] void refuseLine(const std::filesystem::path& file, std::uint64_t line, const std::string& why) {
   throw RecordDefect(ExitCode::kCannotRead,
@@ -49,22 +48,6 @@ class Descriptor {
  private:
   const int number_;
 };
-
-bool isSameFile(int descriptor, const std::filesystem::path& file) {
-  struct stat open {};
-  struct stat named {};
-  return ::fstat(descriptor, &open) == 0 && ::stat(file.c_str(), &named) == 0 && open.st_dev == named.st_dev &&
-         open.st_ino == named.st_ino;
-}
-
-// Returns false with errno on failure: EEXIST if the target exists and may not be replaced.
-bool rename(const std::filesystem::path& from, const std::filesystem::path& to, bool mayReplace) {
-  if (!mayReplace) {
-    if (::renameat2(AT_FDCWD, from.c_str(), AT_FDCWD, to.c_str(), RENAME_NOREPLACE) == 0) return true;
-    if (errno != EINVAL && errno != ENOSYS) return false;  // these two: the file system cannot do it
-  }
-  return std::rename(from.c_str(), to.c_str()) == 0;
-}
 
 // Reads a line without its line end, like std::getline, but stops after a line that is too long to be accepted.
 bool readLine(std::istream& stream, std::string& line) {
@@ -123,10 +106,15 @@ std::string recordLine(const RunEvent& event, std::uint64_t sequence) {
 }
 
 RecordWriter::RecordWriter(std::filesystem::path file, Unfinished unfinished) : file_(std::move(file)) {
+  if (unfinished == Unfinished::kReplace) {
+    create(file_, unfinished);
+    return;
+  }
   std::error_code error;
   if (std::filesystem::is_directory(file_, error)) refuse("it is a directory");
-  if (std::filesystem::exists(file_, error) && !std::filesystem::is_regular_file(file_, error)) {
-    descriptor_ = ::open(file_.c_str(), O_WRONLY | O_CLOEXEC);
+  const std::optional<int> own = ownDescriptor(file_);
+  if (own || (std::filesystem::exists(file_, error) && !std::filesystem::is_regular_file(file_, error))) {
+    descriptor_ = own ? writableCopyOf(*own) : ::open(file_.c_str(), O_WRONLY | O_CLOEXEC);
     if (descriptor_ < 0) refuse(std::strerror(errno));
     return;
   }
@@ -140,24 +128,33 @@ void RecordWriter::refuse(const std::string& why) const {
 }
 
 void RecordWriter::create(const std::filesystem::path& target, Unfinished unfinished) {
-  const bool replaces = unfinished == Unfinished::kReplace;
-  std::filesystem::path temporary = target;
-  temporary += "." + std::to_string(::getpid()) + ".tmp";
-  const Descriptor created(::open(temporary.c_str(), O_WRONLY | O_CREAT | O_EXCL | O_CLOEXEC, kMode));
-  if (created.number() < 0) refuse(std::strerror(errno));
-  ::flock(created.number(), LOCK_EX | LOCK_NB);
-  for (;;) {
-    const Descriptor old(replaces ? -1 : ::open(target.c_str(), O_RDONLY | O_NOFOLLOW | O_CLOEXEC));
-    const bool isBusy = old.number() >= 0 && ::flock(old.number(), LOCK_EX | LOCK_NB) != 0 && errno == EWOULDBLOCK;
-    if (!isBusy && old.number() >= 0 && !isSameFile(old.number(), target)) continue;  // replaced in the meantime
-    const bool mayReplace = replaces || old.number() >= 0 || ::access(target.c_str(), F_OK) == 0;
-    if (!isBusy && rename(temporary, target, mayReplace)) break;
-    if (!isBusy && errno == EEXIST) continue;  // created in the meantime
-    const std::string why = isBusy ? "another process is writing it" : std::strerror(errno);
-    ::unlink(temporary.c_str());
-    refuse(why);
+  try {
+    ReplacementFile created(target);
+    if (const int failure = unfinished == Unfinished::kReplace ? created.putInPlace(true) : replace(target, created);
+        failure != 0) {
+      refuse(std::strerror(failure));
+    }
+    descriptor_ = ::fcntl(created.descriptor(), F_DUPFD_CLOEXEC, 0);  // keeps the lock
+  } catch (const std::system_error& problem) {
+    refuse(std::strerror(problem.code().value()));
   }
-  descriptor_ = ::fcntl(created.number(), F_DUPFD_CLOEXEC, 0);  // keeps the lock
+}
+
+// Puts the new file in the place of a record that nobody is writing. Returns 0 or an error number.
+int RecordWriter::replace(const std::filesystem::path& target, ReplacementFile& created) const {
+  for (;;) {
+    const Descriptor old(::open(target.c_str(), O_RDONLY | O_NOFOLLOW | O_CLOEXEC));
+    if (old.number() >= 0) {
+      if (::flock(old.number(), LOCK_EX | LOCK_NB) != 0 && errno == EWOULDBLOCK)
+        refuse("another process is writing it");
+      if (!isSameFile(old.number(), target)) continue;  // replaced in the meantime
+    }
+    struct stat status {};
+    const bool exists = ::lstat(target.c_str(), &status) == 0;
+    if (exists && created.inherit(status) == EPERM && status.st_uid != ::geteuid()) refuse(kOfAnotherUser);
+    const int failure = created.putInPlace(exists);
+    if (failure != EEXIST) return failure;  // otherwise created in the meantime
+  }
 }
 
 RecordWriter::~RecordWriter() { ::close(descriptor_); }

@@ -3,6 +3,7 @@
 
 #include "host/error/exit_code.h"
 #include "host/model/run_event.h"
+#include "host/system/replacement_file.h"
 
 #include <cstdint>
 #include <filesystem>
@@ -23,11 +24,13 @@ std::string recordLine(const RunEvent& event, std::uint64_t sequence);
 // Thread: one at a time.
 class RecordWriter final : public RunEventSink {
  public:
-  // What happens to an existing record that another writer has not finished.
+  // What happens to an existing record that another writer has not finished. With kReplace whatever is at the place is
+  // replaced, also a link or a pipe, which somebody may have planted there.
   enum class Unfinished { kRefuse, kReplace };
 
-  // Creates the file, replacing an existing one atomically. It is locked until the writer ends. Throws a CommandError
-  // (kCannotWrite) if it cannot be created.
+  // Creates the file, replacing an existing one atomically and keeping its owner and permissions. It is locked until
+  // the writer ends. Writes to the descriptor that /dev/stdout and its like name. Throws a CommandError (kCannotWrite)
+  // if it cannot be created.
   explicit RecordWriter(std::filesystem::path file, Unfinished unfinished = Unfinished::kRefuse);
   ~RecordWriter() override;
 
@@ -44,6 +47,7 @@ class RecordWriter final : public RunEventSink {
   [[noreturn]] void refuse(const std::string& why) const;
   // Creates the regular file at `target`.
   void create(const std::filesystem::path& target, Unfinished unfinished);
+  int replace(const std::filesystem::path& target, ReplacementFile& created) const;
   void write(const std::string& line);
 
   const std::filesystem::path file_;

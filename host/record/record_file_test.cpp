@@ -269,6 +269,65 @@ TEST_F(RecordFileTest, TakesThePlaceOfAnOldFileAtOnce) {
   EXPECT_EQ(std::distance(fs::directory_iterator(directory_.path()), fs::directory_iterator()), 1);
 }
 
+TEST_F(RecordFileTest, KeepsPermissionsAndOwnerOfTheRecordThatItReplaces) {
+  write(wholeRun());
+  ASSERT_EQ(::chmod(file_.c_str(), 0640), 0);
+  const uid_t owner = ::geteuid() == 0 ? 54'321 : ::geteuid();
+  if (::geteuid() == 0) {
+    ASSERT_EQ(::chown(file_.c_str(), owner, 54'322), 0);
+  }
+  write(wholeRun());
+  struct stat status {};
+  ASSERT_EQ(::stat(file_.c_str(), &status), 0);
+  EXPECT_EQ(status.st_mode & 07777U, 0640U);
+  EXPECT_EQ(status.st_uid, owner);
+}
+
+TEST_F(RecordFileTest, DoesNotTakeARecordFromAnotherUser) {
+  if (::geteuid() != 0) GTEST_SKIP() << "only root can make a file another's";
+  write(wholeRun());
+  ASSERT_EQ(::chmod(directory_.path().c_str(), 0777), 0);
+  ASSERT_EQ(::seteuid(54'321), 0);
+  const std::string refusal = refusalOf(ExitCode::kCannotWrite, [&] { const RecordWriter writer(file_); });
+  ASSERT_EQ(::seteuid(0), 0);
+  EXPECT_THAT(refusal,
+              testing::EndsWith("cannot be written: it belongs to another user; remove it first, or name another "
+                                "file"));
+  EXPECT_EQ(readRecord(file_).events.size(), wholeRun().size());
+}
+
+TEST_F(RecordFileTest, ReplacesWhateverSomebodyPlantedWhereItMay) {
+  const auto replaceIt = [this] {
+    RecordWriter writer(file_, RecordWriter::Unfinished::kReplace);
+    writer.onEvent(runOf({}));
+  };
+  directory_.write("precious", "precious");
+  fs::create_symlink("precious", file_);
+  replaceIt();
+  EXPECT_EQ(directory_.read("precious"), "precious");
+  EXPECT_TRUE(fs::is_regular_file(fs::symlink_status(file_)));
+  EXPECT_EQ(readRecord(file_).events.size(), 1U);
+  fs::remove(file_);
+  ASSERT_EQ(::mkfifo(file_.c_str(), 0600), 0);
+  replaceIt();
+  EXPECT_EQ(readRecord(file_).events.size(), 1U);
+  fs::remove(file_);
+  fs::create_directory(file_);
+  EXPECT_THROW(replaceIt(), CommandError);
+}
+
+TEST_F(RecordFileTest, WritesToADescriptorOfThisProcessAndDoesNotReplaceTheFileBehindIt) {
+  const fs::path out = directory_.write("out", "before\n");
+  const int descriptor = ::open(out.c_str(), O_WRONLY | O_APPEND | O_CLOEXEC);
+  {
+    RecordWriter writer("/dev/fd/" + std::to_string(descriptor));
+    writer.onEvent(runOf({}));
+  }
+  ASSERT_EQ(::write(descriptor, "after", 5), 5);
+  ::close(descriptor);
+  EXPECT_EQ(directory_.read("out"), "before\n" + recordLine(runOf({}), 0) + "after");
+}
+
 TEST_F(RecordFileTest, FollowsALink) {
   directory_.write("target", "old");
   fs::create_symlink("target", file_);

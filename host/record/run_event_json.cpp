@@ -38,7 +38,7 @@ std::string textAt(const Json& json, const char* key) { return textFrom(memberOf
 
 Date dateAt(const Json& json, const char* key) {
   const std::optional<Date> date = parseTimestamp(get<std::string>(json, key));
-  if (!date) throw InputError(std::string("\"") + key + "\" is not a timestamp");
+  if (!date) throw InputError(std::string("\"") + key + "\" is not a timestamp of the years 1678 to 2261");
   return *date;
 }
 

@@ -238,7 +238,12 @@ TEST(EventFrom, SaysWhatIsWrong) {
       {R"({"event":5})", "\"event\" has the wrong type"},
       {R"({"event":"runbegan"})", "unknown event 'runbegan'"},
       {R"({"event":"stageBegan","stage":"pause","date":""})", "unknown stage 'pause'"},
-      {R"({"event":"stageBegan","stage":"run","date":"today"})", "\"date\" is not a timestamp"},
+      {R"({"event":"stageBegan","stage":"run","date":"today"})",
+       "\"date\" is not a timestamp of the years 1678 to 2261"},
+      {R"({"event":"stageBegan","stage":"run","date":"2262-04-11T23:47:16.854775808Z"})",
+       "\"date\" is not a timestamp of the years 1678 to 2261"},
+      {R"({"event":"stageBegan","stage":"run","date":"9999-12-31T23:59:59.999999999Z"})",
+       "\"date\" is not a timestamp of the years 1678 to 2261"},
       {R"({"event":"stageEnded","stage":"run","date":"2026-11-21T01:08:00.000000000Z","nanoseconds":1.5})",
        "\"nanoseconds\" has the wrong type"},
       {R"({"event":"stageEnded","stage":"run","date":"2026-11-21T01:08:00.000000000Z",)"

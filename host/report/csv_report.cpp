@@ -20,6 +20,8 @@ enum class Group { kExperiment, kImage, kOfImage, kSample, kSamples, kMeasuremen
 using Column = std::pair<Group, std::string>;
 using Row = std::map<Column, std::string>;
 
+std::string cellOf(const Value& value) { return value.isNumber() ? defaultText(value) : textCell(defaultText(value)); }
+
 Column experimentColumn() { return {Group::kExperiment, "experiment"}; }
 Column measurementColumn() { return {Group::kMeasurement, "measurement"}; }
 Column valueColumn() { return {Group::kValue, "value"}; }
@@ -33,7 +35,7 @@ void visitImage(const Row& base, const Dictionary& image, Visit&& visit) {
     if (isSamples(value)) {
       count = std::max(count, value.array()->size());
     } else {
-      row[{Group::kOfImage, name}] = defaultText(value);
+      row[{Group::kOfImage, name}] = cellOf(value);
     }
   }
   for (std::size_t sample = 0; sample < count; ++sample) {
@@ -51,7 +53,7 @@ void visitImage(const Row& base, const Dictionary& image, Visit&& visit) {
 template <class Visit>
 void visitRows(const std::vector<DiagnosticRecord>& records, Visit&& visit) {
   for (const DiagnosticRecord& record : records) {
-    Row row{{experimentColumn(), record.name}};
+    Row row{{experimentColumn(), textCell(record.name)}};
     std::size_t number = 0;
     for (const auto& [ignored, value] : record.auxiliaryData) {
       for (const Dictionary* const image : imagesIn(value)) {
@@ -60,10 +62,10 @@ void visitRows(const std::vector<DiagnosticRecord>& records, Visit&& visit) {
       }
     }
     for (const auto& [name, measurement] : record.measurements) {
-      visit(Row{{experimentColumn(), record.name},
-                {measurementColumn(), name},
+      visit(Row{{experimentColumn(), textCell(record.name)},
+                {measurementColumn(), textCell(name)},
                 {valueColumn(), defaultText(measurement.value())},
-                {unitColumn(), measurement.unit().symbol()}});
+                {unitColumn(), textCell(measurement.unit().symbol())}});
     }
   }
 }
@@ -84,7 +86,7 @@ const std::vector<std::string_view> kDiagnosticColumns = {
 
 // Appends the name of the limit and the four cells of its bounds.
 void addLimit(std::vector<std::string>& cells, const std::optional<QZLimit>& limit) {
-  cells.push_back(limit ? limit->name() : std::string());
+  cells.push_back(limit ? textCell(limit->name()) : std::string());
   for (const auto which : {&QZLimit::lowerBound, &QZLimit::upperBound}) {
     const QZBound* const bound = limit ? ((*limit).*which)().get() : nullptr;
     cells.push_back(bound == nullptr ? std::string() : defaultText(bound->value().value()));
@@ -94,12 +96,13 @@ void addLimit(std::vector<std::string>& cells, const std::optional<QZLimit>& lim
 
 // Appends one line. `cells` are those of a result; empty if the diagnostic has none.
 void appendDiagnosticLine(std::string& csv, const DiagnosticRecord& record, const std::vector<std::string>& ofResult) {
-  std::vector<std::string> cells{record.name, std::string(nameOf(record.verdict))};
+  std::vector<std::string> cells{textCell(record.name), std::string(nameOf(record.verdict))};
   cells.insert(cells.end(), ofResult.begin(), ofResult.end());
   cells.resize(kDiagnosticColumns.size() - 4);
   if (const DiagnosticErrorPtr& error = record.error; error != nullptr) {
     cells.emplace_back(errorStageText(record));
-    cells.insert(cells.end(), {error->domain(), std::to_string(error->code()), error->localizedDescription()});
+    cells.insert(cells.end(),
+                 {textCell(error->domain()), std::to_string(error->code()), textCell(error->localizedDescription())});
   }
   cells.resize(kDiagnosticColumns.size());
   appendLine(csv, {cells.begin(), cells.end()});
@@ -108,7 +111,8 @@ void appendDiagnosticLine(std::string& csv, const DiagnosticRecord& record, cons
 std::vector<std::string> cellsOf(const QZMeasuredResult& result, const std::optional<QZLimit>& limit,
                                  std::string_view verdict) {
   const Measurement& measurement = result.measurement();
-  std::vector<std::string> cells = {result.name(), defaultText(measurement.value()), measurement.unit().symbol()};
+  std::vector<std::string> cells = {textCell(result.name()), defaultText(measurement.value()),
+                                    textCell(measurement.unit().symbol())};
   addLimit(cells, limit);
   cells.emplace_back(verdict);
   return cells;
@@ -120,6 +124,13 @@ std::vector<std::string> cellsOf(const LimitCheck& check) {
 }
 
 }  // namespace
+
+std::string textCell(std::string_view text) {
+  const std::size_t first = text.find_first_not_of('\'');
+  const bool looksLikeFormula =
+      first != std::string_view::npos && std::string_view("=+-@\t\r").find(text[first]) != std::string_view::npos;
+  return (looksLikeFormula ? "'" : "") + std::string(text);
+}
 
 std::string csvField(std::string_view text) {
   if (text.find_first_of(",\"\r\n") == std::string_view::npos) return std::string(text);
@@ -138,10 +149,12 @@ std::string experimentCsv(const std::vector<DiagnosticRecord>& records) {
   });
   if (columns.empty()) columns = {experimentColumn(), measurementColumn(), valueColumn(), unitColumn()};
   std::string csv;
+  std::vector<std::string> header;
+  header.reserve(columns.size());
+  for (const Column& column : columns) header.push_back(textCell(column.second));
+  appendLine(csv, {header.begin(), header.end()});
   std::vector<std::string_view> fields;
   fields.reserve(columns.size());
-  for (const Column& column : columns) fields.emplace_back(column.second);
-  appendLine(csv, fields);
   visitRows(records, [&](const Row& row) {
     fields.clear();
     for (const Column& column : columns) {

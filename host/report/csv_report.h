@@ -9,6 +9,9 @@
 
 namespace quazor {
 
+// A text cell; a cell with a number needs no change.
+std::string textCell(std::string_view text);
+
 // Formats one field according to RFC 4180: a field with a comma, a quote or a line end is quoted, and its quotes are
 // doubled.
 std::string csvField(std::string_view text);

@@ -43,6 +43,52 @@ TEST(CsvField, QuotesOnlyWhatNeedsIt) {
   for (const Row& row : kRows) EXPECT_EQ(csvField(row.text), row.field) << row.text;
 }
 
+TEST(Csv, KeepsTextsFromBeingTakenForFormulas) {
+  struct Row {
+    const char* text;
+    const char* cell;
+  };
+  constexpr Row kRows[] = {
+      {"=1+1", "'=1+1"},
+      {"+1", "'+1"},
+      {"-1", "'-1"},
+      {"@SUM(A1)", "'@SUM(A1)"},
+      {"\t=1", "'\t=1"},
+      {"'=1", "\'\'=1"},
+      {"=\"a\"", "\"'=\"\"a\"\"\""},
+      {"a=1", "a=1"},
+      {" =1", " =1"},
+      {"'a", "'a"},
+      {"'", "'"},
+      {"", ""},
+  };
+  for (const auto& [text, cell] : kRows) {
+    DiagnosticRecord experiment = experimentOf(text, {});
+    experiment.measurements.set(text, Measurement(-0.5, QZUnit::unitWithSymbol(text)));
+    EXPECT_EQ(experimentCsv({experiment}),
+              "experiment,measurement,value,unit\n" + std::string(cell) + ',' + cell + ",-0.5," + cell + '\n')
+        << text;
+    DiagnosticRecord diagnostic;
+    diagnostic.name = text;
+    diagnostic.verdict = Verdict::kError;
+    diagnostic.error = errorWithMessage(text, -7, text, nullptr);
+    QZMeasuredResult result(text, Measurement(-2, QZUnit::unitWithSymbol(text)));
+    result.setLimit(QZLimit(text));
+    diagnostic.measuredResults.push_back(judgeResult(result));
+    const std::string csv = diagnosticCsv({diagnostic});
+    EXPECT_EQ(csv.substr(csv.find('\n') + 1), std::string(cell) + ",error," + cell + ",-2," + cell + ',' + cell +
+                                                  ",,,,,none,," + cell + ",-7," + cell + '\n')
+        << text;
+  }
+}
+
+TEST(Csv, KeepsTheTextsOfImagesFromBeingTakenForFormulas) {
+  const Value image(Dictionary{{"-b", "=c"}, {"n", -1}, {"=s", Array{-5}}});
+  EXPECT_EQ(experimentCsv({experimentOf("X", {{"images", image}})}),
+            "experiment,image,'-b,n,sample,'=s\n"
+            "X,1,'=c,-1,0,-5\n");
+}
+
 TEST(ExperimentCsv, HasALineForEachSample) {
   const Value image0(imageOf(4294967295U, {-2147483648, 1}, {2, 3}));
   const Value image1(imageOf(8, {4, 5}, {6, 7}));

@@ -20,11 +20,15 @@ std::vector<std::pair<std::string, std::string>> columnsOf(const RunStarted& run
     plugins += plugin;
     separator = "; ";
   }
-  std::vector<std::pair<std::string, std::string>> columns = {
-      {"run", run.id},          {"date", timestampText(run.date)},          {"host", run.host},
-      {"program", run.program}, {"contract", std::to_string(run.contract)}, {"plugins", std::move(plugins)},
-      {"phone", run.phone},     {"seed", std::to_string(run.seed)}};
-  for (const auto& [key, value] : run.tags) columns.emplace_back("tag." + key, value);
+  std::vector<std::pair<std::string, std::string>> columns = {{"run", run.id},
+                                                              {"date", timestampText(run.date)},
+                                                              {"host", textCell(run.host)},
+                                                              {"program", textCell(run.program)},
+                                                              {"contract", std::to_string(run.contract)},
+                                                              {"plugins", textCell(plugins)},
+                                                              {"phone", textCell(run.phone)},
+                                                              {"seed", std::to_string(run.seed)}};
+  for (const auto& [key, value] : run.tags) columns.emplace_back("tag." + key, textCell(value));
   return columns;
 }
 

@@ -6,6 +6,7 @@
 #include "host/model/run_event.h"
 #include "host/plugin/diagnostic_registry.h"
 #include "host/plugin/parameters.h"
+#include "host/run/log_limit.h"
 
 #include <functional>
 #include <memory>
@@ -18,6 +19,7 @@ struct RunOptions {
   // True if the user has interrupted the run; may be empty. Asked between the stages, on the thread of the run: no
   // setup, run or analysis begins then, but the teardown of a successful setup does.
   std::function<bool()> isInterrupted;
+  LogLimit logLimit;  // of a run in a separate process, which then does not send what would not be kept
   // Called with the phone of each run before it is used, and may keep it; may be empty.
   std::function<void(const std::shared_ptr<const Phone>&)> watchPhone;
 };

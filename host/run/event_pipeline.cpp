@@ -33,7 +33,8 @@ std::string problemOf(const RecordWriter& record) {
 
 }  // namespace
 
-EventPipeline::EventPipeline(const EventPipelineOptions& options, Console& console) : report_(options.report, console) {
+EventPipeline::EventPipeline(const EventPipelineOptions& options, Console& console)
+    : logLimit_(options.logLimit), logCap_(options.logLimit), report_(options.report, console) {
   if (!options.record.empty()) records_.push_back(std::make_unique<RecordWriter>(options.record));
   required_ = records_.size();
   if (options.keepsLastRun) {
@@ -44,7 +45,15 @@ EventPipeline::EventPipeline(const EventPipelineOptions& options, Console& conso
 
 void EventPipeline::onEvent(const RunEvent& event) {
   const std::lock_guard lock(mutex_);
-  pass(event);
+  if (std::holds_alternative<DiagnosticStarted>(event)) logCap_ = LogCap(logLimit_);
+  if (!isLeftOut(event)) pass(event);
+}
+
+bool EventPipeline::isLeftOut(const RunEvent& event) {
+  const auto* const logged = std::get_if<Logged>(&event);
+  if (logged == nullptr || logged->isOfHost) return false;
+  lastLine_ = logged->line.time;
+  return !logCap_.admits(logged->line.text.size());
 }
 
 void EventPipeline::pass(const RunEvent& event) {
@@ -68,6 +77,7 @@ void EventPipeline::endDiagnostic() {
 }
 
 void EventPipeline::endOpenDiagnostic() {
+  if (logCap_.leftOut() > 0) pass(leftOutLine(logCap_.leftOut(), lastLine_));
   for (std::size_t i = 0; i < required_; ++i) {
     const RecordWriter& record = *records_[i];
     if (record.problem().empty()) continue;

@@ -4,7 +4,9 @@
 #include "host/model/record_builder.h"
 #include "host/record/record_file.h"
 #include "host/report/run_report.h"
+#include "host/run/log_limit.h"
 
+#include <chrono>
 #include <cstdint>
 #include <filesystem>
 #include <functional>
@@ -22,9 +24,11 @@ struct EventPipelineOptions {
   bool keepsLastRun = false;
   bool systemLog = false;
   ReportOptions report;
+  LogLimit logLimit;  // of each diagnostic
 };
 
-// Every event is recorded before it is shown to the user.
+// Every event is recorded before it is shown to the user. Log lines beyond the limit are neither recorded nor shown; a
+// line at the end of the diagnostic tells their number.
 //
 // Thread: any; it handles one event at a time.
 class EventPipeline final : public RunEventSink {
@@ -50,6 +54,8 @@ class EventPipeline final : public RunEventSink {
   Progress& progress() { return report_.progress(); }
 
  private:
+  // True for a log line beyond the limit.
+  bool isLeftOut(const RunEvent& event);
   void pass(const RunEvent& event);
   void endOpenDiagnostic();
   void interruptRun();
@@ -58,6 +64,9 @@ class EventPipeline final : public RunEventSink {
   std::size_t required_ = 0;  // the number of records that the user requested; they come first
   std::uint64_t recorded_ = 0;
   std::shared_ptr<LogBackend> systemLog_;
+  const LogLimit logLimit_;
+  LogCap logCap_;
+  std::chrono::nanoseconds lastLine_{};  // its time
   RecordBuilder builder_;
   RunReport report_;
   std::timed_mutex mutex_;

@@ -215,6 +215,54 @@ TEST_F(EventPipelineTest, LetsOneEventThroughAtATime) {
   EXPECT_EQ(runIn(record_).records[0].log.size(), 2U * kLines);
 }
 
+// The texts of the log lines of a recorded diagnostic.
+std::vector<std::string> logOf(const DiagnosticRecord& record) {
+  std::vector<std::string> texts;
+  for (const LogLine& line : record.log) texts.push_back(line.text);
+  return texts;
+}
+
+Logged lineOf(std::string text) { return {{{}, LogLevel::kDefault, std::move(text), momentAt(3)}}; }
+
+TEST_F(EventPipelineTest, KeepsNoMoreLogLinesThanTheLimitOfEachDiagnostic) {
+  options_.logLimit = {2, 1000};
+  EventPipeline events(keeping(), console_);
+  events.onEvent(runOf({"A", "B"}));
+  for (const char* const name : {"A", "B"}) {
+    events.onEvent(beginningOf(name));
+    for (const char* const text : {"one", "two", "three", "four"}) events.onEvent(lineOf(text));
+    events.onEvent(Logged{lineOf("of the host").line, true});
+    events.endDiagnostic();
+  }
+  events.onEvent(RunEnded{std::nullopt, momentAt(99)});
+  const RecordedRun run = runIn(record_);
+  ASSERT_EQ(run.records.size(), 2U);
+  for (const DiagnosticRecord& record : run.records) {
+    EXPECT_THAT(logOf(record),
+                testing::ElementsAre("one", "two", "of the host", "2 more log lines were left out (--log-limit)"));
+  }
+  EXPECT_EQ(lastRun(), directory_.read("record"));
+  EXPECT_THAT(problemsOf(readRecord(record_).events), IsEmpty());
+}
+
+TEST_F(EventPipelineTest, TellsWhatWasLeftOutAlsoOfAnInterruptedDiagnostic) {
+  options_.logLimit = {1, 1000};
+  EventPipeline events(options_, console_);
+  takeAll(events, {runOf({"A"}), beginningOf("A"), lineOf("one"), lineOf("two")});
+  events.interruptAndLeave([] {});
+  EXPECT_THAT(logOf(runIn(record_).records[0]),
+              testing::ElementsAre("one", "1 more log line was left out (--log-limit)"));
+}
+
+TEST_F(EventPipelineTest, KeepsNoMoreTextOfTheLogThanItsLimit) {
+  options_.logLimit = {1000, 10};
+  EventPipeline events(options_, console_);
+  takeAll(events, {runOf({"A"}), beginningOf("A"), lineOf("12345"), lineOf("123456"), lineOf("1")});
+  events.endDiagnostic();
+  EXPECT_THAT(logOf(runIn(record_).records[0]),
+              testing::ElementsAre("12345", "2 more log lines were left out (--log-limit)"));
+}
+
 TEST_F(EventPipelineTest, SendsLogLinesToTheSystemsLogWhenAskedTo) {
   // A test cannot read the system log, so it only checks that nothing else changes.
   options_.systemLog = true;

@@ -9,6 +9,7 @@
 #include "host/record/run_event_json.h"
 #include "host/run/child_connection.h"
 #include "host/run/event_order.h"
+#include "host/run/log_limit.h"
 #include "host/system/identity.h"
 #include "host/system/shared_counter.h"
 #include "host/system/supervision.h"
@@ -78,7 +79,9 @@ class IsolatedRun {
 
   bool isCompleted() const { return order_.isCompleted(); }
 
-  void conclude(const Supervised& end) {
+  // `leftOut` is the number of log lines that the process did not send.
+  void conclude(const Supervised& end, std::uint64_t leftOut) {
+    if (leftOut > 0) events_.onEvent(leftOutLine(leftOut, time_));
     if (droppedLines_ > 0) log(formatMessage("%@ more lines of output were dropped", droppedLines_));
     if (isInterrupted()) {  // the failure was told at once
       if (!order_.isCompleted()) tellAboutTeardown();
@@ -123,7 +126,7 @@ class IsolatedRun {
     log("output: " + std::string(line));
   }
 
-  void log(std::string text) { events_.onEvent(Logged{{time_, LogLevel::kDefault, std::move(text), dateNow()}}); }
+  void log(std::string text) { events_.onEvent(Logged{{time_, LogLevel::kDefault, std::move(text), dateNow()}, true}); }
 
   std::string during() const { return formatMessage("the stage %@ of %@", nameOf(order_.stage()), diagnostic_.name); }
 
@@ -221,7 +224,7 @@ void countFrames(const std::weak_ptr<const Phone>& phone, SharedCounter& counter
 
 bool superviseRun(const IsolationOptions& options, WatchedSignals& signals, const Diagnostic& diagnostic,
                   const ResolvedParameters& parameters, const std::function<void(RunEventSink& toParent)>& body,
-                  SharedCounter& interrupted, Progress& progress, RunEventSink& events) {
+                  SharedRunState& shared, Progress& progress, RunEventSink& events) {
   const Deadlines deadlines(parameters, options.deadlines);
   const int requestsBefore = signals.requestsToEnd();
   std::string token;
@@ -240,11 +243,11 @@ bool superviseRun(const IsolationOptions& options, WatchedSignals& signals, cons
                                     "the process of " + diagnostic.name + " could not be created: " + problem.what())});
     return true;
   }
-  IsolatedRun run(diagnostic, deadlines, options.grace, token, interrupted, progress, events);
+  IsolatedRun run(diagnostic, deadlines, options.grace, token, shared.interrupted, progress, events);
   Supervised end = supervise(*child, signals, run.supervision(signals));
   child.reset();  // ends what the process has left behind
   end = withInterrupt(end, run.isCompleted() && signals.requestsToEnd() > requestsBefore);
-  run.conclude(end);
+  run.conclude(end, shared.leftOut.get());
   return end.how != SupervisionEnd::kInterrupted;
 }
 
@@ -252,9 +255,10 @@ bool runIsolated(const IsolationOptions& options, WatchedSignals& signals, const
                  const ResolvedParameters& parameters, const RunOptions& runOptions, const QZExperimentResult* result,
                  Progress& progress, RunEventSink& events) {
   SharedCounter frames;
-  SharedCounter interrupted;
+  SharedRunState shared;
   if (progress.isShown()) progress.countFrames([&frames] { return frames.get(); });
-  const auto body = [&](RunEventSink& toParent) {
+  const auto body = [&](RunEventSink& everything) {
+    LimitedLog toParent(everything, runOptions.logLimit, shared.leftOut);
     const std::optional<Diagnostic> loaded = loadDiagnostic(options, diagnostic, toParent);
     if (!loaded) {
       toParent.onEvent(DiagnosticCompleted{});
@@ -262,14 +266,14 @@ bool runIsolated(const IsolationOptions& options, WatchedSignals& signals, const
       analyzeResult(*loaded, parameters, *result, runOptions.logLevel, toParent);
     } else {
       RunOptions watched = runOptions;
-      watched.isInterrupted = [&interrupted] { return interrupted.get() != 0; };
+      watched.isInterrupted = [&shared] { return shared.interrupted.get() != 0; };
       if (progress.isShown()) {
         watched.watchPhone = [&frames](const std::shared_ptr<const Phone>& phone) { countFrames(phone, frames); };
       }
       runDiagnostic(*loaded, parameters, watched, toParent);
     }
   };
-  return superviseRun(options, signals, diagnostic, parameters, body, interrupted, progress, events);
+  return superviseRun(options, signals, diagnostic, parameters, body, shared, progress, events);
 }
 
 }  // namespace quazor

@@ -26,15 +26,21 @@ struct IsolationOptions {
   std::chrono::nanoseconds grace = kDefaultGrace;
 };
 
+// Memory that quazor and the process of a run share.
+struct SharedRunState {
+  SharedCounter interrupted;  // 1 once the user has interrupted the run
+  SharedCounter leftOut;      // the number of log lines that the process did not send
+};
+
 // Calls `body` in a separate process and passes on the events that it sends, from the first stage to
 // DiagnosticCompleted, which follows only when the process has ended by itself with exit code 0. Otherwise it is
 // missing, and a Failed event for the current or last stage gives the reason. After the last stage, the process has as
 // much time to end as that stage had. Standard output and standard error of the process become log lines. Returns false
 // if the user interrupted the run: a setup or run that has begun then has the time `grace` to return, and its teardown
-// follows. `interrupted`, which the body can read, is 1 from then on.
+// follows. The body can use `shared`.
 bool superviseRun(const IsolationOptions& options, WatchedSignals& signals, const Diagnostic& diagnostic,
                   const ResolvedParameters& parameters, const std::function<void(RunEventSink& toParent)>& body,
-                  SharedCounter& interrupted, Progress& progress, RunEventSink& events);
+                  SharedRunState& shared, Progress& progress, RunEventSink& events);
 
 // Like runDiagnostic, but in a separate process, as superviseRun, which loads only the plug-ins that the diagnostic
 // needs, if they are known.

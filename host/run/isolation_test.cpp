@@ -258,6 +258,21 @@ TEST_F(RunTest, EndsAStageAtItsDeadlineHoweverMuchItLogs) {
   EXPECT_THAT(logOf(record), testing::Contains("again"));
 }
 
+TEST_F(RunTest, CountsTheLogLinesBeyondTheLimitHoweverTheProcessEnds) {
+  runOptions_.logLimit = {3, 1000};
+  const std::vector<std::string> log = logOf(runUnrulyForTooLong(13));
+  ASSERT_EQ(log.size(), 4U);
+  EXPECT_THAT(log[3], testing::MatchesRegex("[0-9]+ more log lines were left out \\(--log-limit\\)"));
+  runOptions_.logLimit = {1, 1000};
+  EXPECT_THAT(logOf(run("working", "Fake.One", {"duration=2", "measured=90", "minimum=90"})),
+              ElementsAre("an error line", "2 more log lines were left out (--log-limit)"));
+}
+
+TEST_F(RunTest, KeepsWhatThePluginPrintsBesideTheLimitOfItsLog) {
+  runOptions_.logLimit = {1, 1000};
+  EXPECT_THAT(logOf(runUnruly(7)), testing::IsSupersetOf({"output: printed", "output: twice"}));
+}
+
 TEST_F(RunTest, EndsWhenTheUserInterruptsIt) {
   ASSERT_EQ(::kill(::getpid(), SIGINT), 0);
   options_.deadlines.clear();
@@ -329,7 +344,7 @@ class SupervisedRunTest : public IsolationTest {
     Diagnostic diagnostic;
     diagnostic.name = "One";
     events_.events.clear();
-    goesOn_ = superviseRun(options_, signals_, diagnostic, {}, body, interrupted_, progress_, events_);
+    goesOn_ = superviseRun(options_, signals_, diagnostic, {}, body, shared_, progress_, events_);
     RecordBuilder builder;
     builder.onEvent(beginningOf("One"));
     for (const RunEvent& event : events_.events) builder.onEvent(event);
@@ -352,11 +367,8 @@ class SupervisedRunTest : public IsolationTest {
     events.onEvent(DiagnosticCompleted{});
   }
 
-  Progress progress_ {
-    nullptr
-
-        SharedCounter interrupted_;
-  };
+  Progress progress_{nullptr};
+  SharedRunState shared_;
   EventList events_;
   std::optional<Stage> errorStage_;
   bool goesOn_ = false;

@@ -67,6 +67,52 @@ TEST_F(OutputFileTest, ReplacesAFileAndKeepsItsPermissions) {
   EXPECT_EQ(entriesIn(directory_.path()), 1U);
 }
 
+TEST_F(OutputFileTest, KeepsTheOwnerOfAFileThatItReplacesOrRefuses) {
+  if (::geteuid() != 0) GTEST_SKIP() << "only root can make a file another's";
+  constexpr uid_t kOther = 54'321;
+  const fs::path file = directory_.write("out", "old");
+  ASSERT_EQ(::chown(file.c_str(), kOther, kOther), 0);
+  EXPECT_EQ(writingOf(file, "new"), "");
+  struct stat status {};
+  ASSERT_EQ(::stat(file.c_str(), &status), 0);
+  EXPECT_EQ(status.st_uid, kOther);
+  EXPECT_EQ(status.st_gid, kOther);
+  ASSERT_EQ(::chmod(directory_.path().c_str(), 0777), 0);
+  ASSERT_EQ(::seteuid(kOther + 1), 0);
+  const std::string validation = validationOf(file);
+  const std::string writing = writingOf(file, "newer");
+  ASSERT_EQ(::seteuid(0), 0);
+  EXPECT_EQ(validation, "it belongs to another user; remove it first, or name another file");
+  EXPECT_EQ(writing, validation);
+  EXPECT_EQ(directory_.read("out"), "new");
+}
+
+TEST_F(OutputFileTest, WritesToADescriptorOfThisProcessAndDoesNotReplaceTheFileBehindIt) {
+  const fs::path file = directory_.write("out", "before ");
+  const int descriptor = ::open(file.c_str(), O_WRONLY | O_APPEND | O_CLOEXEC);
+  const fs::path name = "/dev/fd/" + std::to_string(descriptor);
+  const fs::path link = directory_.path() / "link";
+  fs::create_symlink(name, link);
+  EXPECT_EQ(validationOf(name), "");
+  EXPECT_EQ(writingOf(name, "one "), "");
+  EXPECT_EQ(writingOf("/proc/self/fd/" + std::to_string(descriptor), "two "), "");
+  EXPECT_EQ(writingOf(link, "three"), "");
+  ASSERT_EQ(::write(descriptor, ".", 1), 1);
+  EXPECT_EQ(directory_.read("out"), "before one two three.");
+  ::close(descriptor);
+  EXPECT_EQ(validationOf(name), "Bad file descriptor");
+  EXPECT_EQ(writingOf(name, "four"), "Bad file descriptor");
+}
+
+TEST_F(OutputFileTest, RefusesADescriptorThatIsOnlyRead) {
+  const int descriptor = ::open(directory_.write("out", "old").c_str(), O_RDONLY | O_CLOEXEC);
+  const fs::path name = "/dev/fd/" + std::to_string(descriptor);
+  EXPECT_EQ(validationOf(name), "Bad file descriptor");
+  EXPECT_EQ(writingOf(name, "new"), "Bad file descriptor");
+  ::close(descriptor);
+  EXPECT_EQ(directory_.read("out"), "old");
+}
+
 TEST_F(OutputFileTest, FollowsALinkToAFile) {
   directory_.write("target", "old");
   fs::create_symlink("target", directory_.path() / "link");

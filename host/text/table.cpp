@@ -24,11 +24,22 @@ bool isWideControl(std::string_view character) {
   return character.size() == 2 && character[0] == '\xC2' && static_cast<unsigned char>(character[1]) < 0xA0;
 }
 
+// True for the characters that change the direction of the text around them, which can make a name look like another:
+// U+061C, U+200E, U+200F, U+202A to U+202E, U+2066 to U+2069.
+bool changesDirection(std::string_view character) {
+  if (character == "\xD8\x9C") return true;
+  if (character.size() != 3 || character[0] != '\xE2') return false;
+  const unsigned second = static_cast<unsigned char>(character[1]);
+  const unsigned third = static_cast<unsigned char>(character[2]);
+  if (second == 0x80) return third == 0x8E || third == 0x8F || (third >= 0xAA && third <= 0xAE);
+  return second == 0x81 && third >= 0xA6 && third <= 0xA9;
+}
+
 void appendEscaped(std::string& shown, std::string_view bytes) {
   for (; !bytes.empty(); bytes.remove_prefix(1)) shown += "\\x" + hexadecimal(bytes.substr(0, 1));
 }
 
-// Escapes control characters and invalid UTF-8 as \xNN, except the characters in `allowed`.
+// Escapes control characters, marks of direction and invalid UTF-8 as \xNN, except the characters in `allowed`.
 std::string shownText(std::string_view text, std::string_view allowed) {
   std::string shown;
   shown.reserve(text.size());
@@ -38,8 +49,9 @@ std::string shownText(std::string_view text, std::string_view allowed) {
     text.remove_prefix(sequence.length);
     if (isWideControl(character)) {
       appendEscaped(shown, character.substr(1));  // the second byte equals the code point
-    } else if (!sequence.wellFormed || (isControl(static_cast<unsigned char>(character.front())) &&
-                                        allowed.find(character.front()) == std::string_view::npos)) {
+    } else if (!sequence.wellFormed || changesDirection(character) ||
+               (isControl(static_cast<unsigned char>(character.front())) &&
+                allowed.find(character.front()) == std::string_view::npos)) {
       appendEscaped(shown, character);
     } else {
       shown += character;

@@ -9,8 +9,8 @@
 
 namespace quazor {
 
-// Escapes control characters, including newlines, and bytes that are not UTF-8 as \xNN. Text from a plug-in or a file
-// must not control the user's terminal.
+// Escapes control characters, including newlines, marks of writing direction and bytes that are not UTF-8 as \xNN. Text
+// from a plug-in or a file must not control the user's terminal, nor look there like another text.
 std::string printable(std::string_view text);
 
 // Like printable(), but keeps tabs and newlines, for text of several lines.

@@ -1,5 +1,7 @@
 #include "host/text/table.h"
 
+#include "base/text/hexadecimal.h"
+
 #include <gtest/gtest.h>
 
 #include <sstream>
@@ -59,6 +61,22 @@ TEST(Printable, ShowsEachByteThatIsNotUtf8) {
   EXPECT_EQ(printable("\xC2"), "\\xc2");
   EXPECT_EQ(printable("\xE2\x82\033[m\xE2\x82\xAC"), "\\xe2\\x82\\x1b[m\xE2\x82\xAC");
   EXPECT_EQ(printable("\xED\xA0\x80"), "\\xed\\xa0\\x80");
+}
+
+TEST(Printable, ShowsMarksThatChangeTheDirectionOfText) {
+  const char* const marks[] = {"\u061C", "\u200E", "\u200F", "\u202A", "\u202B", "\u202C",
+                               "\u202D", "\u202E", "\u2066", "\u2067", "\u2068", "\u2069"};
+  for (const std::string mark : marks) {
+    std::string escaped;
+    for (const char unit : mark) escaped += "\\x" + hexadecimal({&unit, 1});
+    EXPECT_EQ(printable("a" + mark + "b"), "a" + escaped + "b");
+    EXPECT_EQ(printableLines(mark + "\n"), escaped + "\n");
+  }
+  // Their neighbours, and letters that are written from right to left, stay.
+  for (const std::string text :
+       {"\u061B", "\u061D", "\u200D", "\u2010", "\u2029", "\u202F", "\u2065", "\u206A", "\u05D0\u05D1", "\u0627"}) {
+    EXPECT_EQ(printable(text), text);
+  }
 }
 
 TEST(PrintableLines, KeepsTabsAndNewLinesAndNothingElseThatSteers) {

@@ -4,8 +4,9 @@
     run_paths.py DIRECTORY...
 
 Each entry of a run path must be absolute or begin with $ORIGIN: an empty or relative one means the working directory, from
-which anybody's library would be loaded. An entry that exists must not be writable by everybody. Exits with 1 and prints a
-line per violation, also if a directory contains no program or library. Needs readelf.
+which anybody's library would be loaded. Neither its group nor everybody may write to an entry or to a folder above it, nor
+create one that is missing; folders above with the sticky bit are excepted, since nobody may replace another's entry there.
+Exits with 1 and prints a line per violation, also if a directory contains no program or library. Needs readelf.
 """
 
 import pathlib
@@ -34,17 +35,29 @@ def entries_of(path):
     return [entry for run_path in RUN_PATH.findall(read.stdout) for entry in run_path.split(":")]
 
 
-def problem_with(entry):
-    """Why an entry is no safe place for libraries; nothing if it is one."""
+def problem_with(entry, file):
+    """Why an entry of the file's run path is no safe place for libraries; nothing if it is one."""
     if not entry:
         return "is empty"
-    if ORIGIN.match(entry):
-        return None
+    if origin := ORIGIN.match(entry):
+        return problem_with_place((file.parent / entry[origin.end():]).resolve())
     if not entry.startswith("/"):
         return "is relative"
-    place = pathlib.Path(entry)
-    if place.exists() and place.stat().st_mode & stat.S_IWOTH:
-        return "may be written by everybody"
+    return problem_with_place(pathlib.Path(entry).resolve())
+
+
+def problem_with_place(place):
+    existing = next(folder for folder in (place, *place.parents) if folder.exists())
+    for folder in (existing, *existing.parents):
+        mode = folder.stat().st_mode
+        if not mode & (stat.S_IWGRP | stat.S_IWOTH) or (folder != existing and mode & stat.S_ISVTX):
+            continue
+        who = "everybody" if mode & stat.S_IWOTH else "its group"
+        if folder == place:
+            return f"may be written by {who}"
+        if folder == existing:
+            return f"does not exist and may be created in {folder} by {who}"
+        return f"is below {folder}, which may be written by {who}"
     return None
 
 
@@ -55,7 +68,7 @@ def violations_in(directory):
     for path in found:
         # An entry that is there twice is one violation.
         for entry in dict.fromkeys(entries_of(path)):
-            if problem := problem_with(entry):
+            if problem := problem_with(entry, path):
                 lines.append(f"{path.relative_to(directory)}: the entry '{entry}' of its run path {problem}")
     return lines, len(found)
 

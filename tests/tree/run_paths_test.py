@@ -30,7 +30,7 @@ class RunPathsTest(unittest.TestCase):
         return run_paths.violations_in(self.root)
 
     def test_absolute_paths_and_those_beside_the_file_are_safe(self):
-        self.assertEqual(self.violations(None, "/usr/lib", "$ORIGIN", "$ORIGIN/../lib:/usr/lib", "/no/such/place"), ([], 5))
+        self.assertEqual(self.violations(None, "/usr/lib", "$ORIGIN", "$ORIGIN/lib:/usr/lib", "/no/such/place"), ([], 5))
 
     def test_an_empty_entry_is_found_wherever_it_is(self):
         lines, count = self.violations("/usr/lib:", ":/usr/lib", "/usr/lib::/lib", "::")
@@ -48,6 +48,37 @@ class RunPathsTest(unittest.TestCase):
         everybodys.chmod(0o1777)
         self.assertEqual(self.violations(everybodys), (
             [f"0.so: the entry '{everybodys}' of its run path may be written by everybody"], 1))
+
+    def folder(self, name, mode):
+        path = self.root / name
+        path.mkdir()
+        path.chmod(mode)
+        return path
+
+    def test_a_place_that_its_group_may_write_is_found(self):
+        groups = self.folder("groups", 0o775)
+        self.assertEqual(self.violations(groups), (
+            [f"0.so: the entry '{groups}' of its run path may be written by its group"], 1))
+
+    def test_a_place_beside_the_file_is_no_exception(self):
+        self.folder("groups", 0o775)
+        lines, _ = self.violations("$ORIGIN/groups", "${ORIGIN}/../" + self.root.name + "/groups", "$ORIGIN")
+        self.assertEqual([line.split("run path ")[1] for line in lines], 2 * ["may be written by its group"])
+
+    def test_a_place_below_one_that_others_may_write_is_found(self):
+        everybodys = self.folder("everybodys", 0o777)
+        (everybodys / "lib").mkdir(0o755)
+        line = f"is below {everybodys}, which may be written by everybody"
+        lines, _ = self.violations(everybodys / "lib", "$ORIGIN/everybodys/lib")
+        self.assertEqual([one.split("run path ")[1] for one in lines], [line, line])
+        everybodys.chmod(0o1777)
+        self.assertEqual(self.violations(everybodys / "lib"), ([], 2))
+
+    def test_a_missing_place_that_others_may_create_is_found(self):
+        everybodys = self.folder("everybodys", 0o1777)
+        self.assertEqual(self.violations(everybodys / "lib"), (
+            [f"0.so: the entry '{everybodys}/lib' of its run path does not exist and may be created in {everybodys} by "
+             "everybody"], 1))
 
     def test_what_is_not_linked_is_left_out(self):
         subprocess.run([COMPILER, "-c", "-x", "c++", "/dev/null", "-o", self.root / "object.o"], check=True)

@@ -1,0 +1,165 @@
+"""Records analyzed again: with new parameters, by somebody else, and from earlier versions."""
+
+import json
+import os
+import unittest
+
+from command_line_fixture import EXPERIMENTS, WORKING, RecordTest, analyze, events_in, quazor
+
+
+class AnalyzeTest(RecordTest):
+    def setUp(self):
+        super().setUp()
+        self.recorded("--set", "measured=90", "--set", "minimum=90", names=["Fake.*"])
+
+    def test_it_comes_to_the_same_verdict(self):
+        result = analyze(self.record)
+        self.assertEqual(result.returncode, 0, result.stderr)
+        self.assertTrue(result.stdout.endswith("2 diagnostics: 2 passed, 0 failed, 0 ended in an error\n"))
+
+    def test_it_takes_new_parameters_and_the_recorded_ones(self):
+        for arguments in (["--set", "minimum=91"], ["--set", "analysis.minimum=91"]):
+            result = analyze(self.record, *arguments, "--format", "json")
+            self.assertEqual(result.returncode, 1, result.stderr)
+            for record in json.loads(result.stdout)["diagnostics"]:
+                self.assertEqual(record["parameters"], {"experiment": {"duration": 1, "measured": 90},
+                                                        "analysis": {"minimum": 91}})
+                self.assertEqual(record["measuredResults"][0]["limit"]["lower"]["value"], 91.0)
+        record = self.directory / "again.jsonl"
+        self.assertEqual(analyze(self.record, "--record", record).returncode, 0)
+        parameter, _ = events_in(record)[1]["parameters"]["analysis"]
+        self.assertEqual(parameter["source"], "command line, in the record")
+
+    def test_its_record_can_be_verified_and_analyzed_again(self):
+        record = self.directory / "again.jsonl"
+        self.assertEqual(analyze(self.record, "--set", "minimum=91", "--record", record).returncode, 1)
+        self.assert_verifies(record)
+        self.assertEqual(analyze(record).returncode, 1)
+        self.assertEqual(analyze(record, "--set", "minimum=90").returncode, 0)
+
+    def test_an_error_in_the_analysis(self):
+        result = analyze(self.record, "--set", "behaviour=22")
+        self.assertEqual(result.returncode, 2)
+        self.assertIn("FakeDomain code 6: analyzing failed", result.stdout)
+
+    def test_what_has_no_result_is_left_out(self):
+        self.recorded("--set", "duration=1", code=2, names=["Fake.One", "Broken.Nothing"], duration=None)
+        result = analyze(self.record)
+        self.assertEqual(result.returncode, 0, result.stderr)
+        self.assertIn("Broken.Nothing has no experiment result in the record and is skipped", result.stderr)
+
+    def test_in_this_process(self):
+        result = analyze(self.record, "--in-process")
+        self.assertEqual(result.returncode, 0, result.stderr)
+
+    def test_what_is_refused(self):
+        self.assert_refused(quazor("analyze", self.directory / "missing"), 66, "cannot be read")
+        self.assert_refused(quazor("analyze"), 64, "RECORD")
+        self.assert_refused(analyze(self.record, "--set", "minimun=1"), 64, "did you mean 'minimum'?")
+        self.assert_refused(analyze(self.record, "--set", "measured=1"), 64,
+                            "no analysis of the selected diagnostics has a parameter 'measured'")
+        self.assert_refused(analyze(self.record, "--set", "experiment.duration=1"), 64,
+                            "--set 'experiment.duration=1': 'quazor analyze' does not run experiments")
+        self.assert_refused(quazor("analyze", self.record, "--plugin", EXPERIMENTS), 64, "there is no diagnostic")
+        self.assert_refused(analyze(self.record, "--realtime"), 64, "--realtime")
+        self.assert_refused(quazor("analyze", self.record, "--plugin", self.directory / "no.so"), 66, "does not exist")
+
+    def test_a_record_without_results_is_refused(self):
+        self.recorded(code=2, names=["Broken.Nothing"], duration=None)
+        result = analyze(self.record)
+        self.assertEqual(result.returncode, 66)
+        self.assertIn("contains no experiment result to analyze", result.stderr)
+
+
+class ForeignRecordTest(RecordTest):
+    """Records that somebody else wrote: they do not choose the code that is run."""
+
+    def setUp(self):
+        super().setUp()
+        self.state = {"XDG_STATE_HOME": str(self.directory / "state")}
+        self.failing = ["--set", "measured=1", "--set", "minimum=90"]
+
+    def installed(self, *arguments):
+        """Records a run of an installed plug-in."""
+        result = quazor("run", "TesselTelemonDiagnostic", "--record", self.record, *arguments, env=self.state)
+        self.assertEqual(result.returncode, 0, result.stderr)
+
+    def test_an_analysis_loads_no_plug_in_that_is_not_installed(self):
+        self.recorded("--set", "measured=90", "--set", "minimum=90")
+        for arguments in ([], ["--in-process"]):
+            with self.subTest(arguments):
+                self.assert_refused(quazor("analyze", self.record, *arguments), 66,
+                                    f"the record names the plug-in '{WORKING}', which is not an installed one", "--plugin")
+        self.assertEqual(analyze(self.record).returncode, 0)
+
+    def test_a_rerun_of_a_given_record_loads_none_either(self):
+        self.recorded(*self.failing, code=1)
+        self.assert_refused(quazor("run", "--only", "failed", "--of", self.record, env=self.state), 66,
+                            f"the record names the plug-in '{WORKING}', which is not an installed one", "--plugin")
+        self.assertEqual(self.run_fake("--only", "failed", "--of", self.record, names=[], env=self.state).returncode, 1)
+
+    def test_installed_plug_ins_are_loaded_whatever_their_path_in_the_record(self):
+        self.installed()
+        result = quazor("analyze", self.record)
+        self.assertEqual(result.returncode, 0, result.stderr)
+        link = self.directory / "link.so"
+        plugin = events_in(self.record)[0]["plugins"][0]
+        link.symlink_to(plugin)
+
+        def rename(events):
+            events[0]["plugins"] = [str(link)]
+
+        again = self.directory / "again.jsonl"
+        result = quazor("analyze", self.changed(rename), "--record", again)
+        self.assertEqual(result.returncode, 0, result.stderr)
+        self.assertEqual(events_in(again)[0]["plugins"], [plugin])
+
+    @unittest.skipUnless(os.geteuid() == 0, "only root can make a file another's")
+    def test_a_last_run_that_belongs_to_another_is_one_of_those(self):
+        result = self.run_fake(*self.failing, env=self.state)
+        self.assertEqual(result.returncode, 1, result.stderr)
+        again = ["run", "--only", "failed", "--phone", self.phone]
+        self.assertEqual(quazor(*again, env=self.state).returncode, 1)
+        os.chown(self.directory / "state/quazor/last_run.jsonl", 54321, 54321)
+        self.assert_refused(quazor(*again, env=self.state), 66, "which is not an installed one")
+
+
+class EarlierRecordTest(RecordTest):
+    """Records that spell the stage analyze as `analyse`."""
+
+    def setUp(self):
+        super().setUp()
+        self.recorded("--set", "measured=90", "--set", "minimum=90")
+        self.earlier = self.changed(self.rename)
+
+    @staticmethod
+    def rename(events):
+        analyses = [event for event in events if event.get("stage") == "analyze"]
+        assert len(analyses) >= 2
+        for event in analyses:
+            event["stage"] = "analyse"
+
+    def test_it_verifies(self):
+        self.assert_verifies(self.earlier)
+
+    def test_it_can_be_analyzed_again(self):
+        result = analyze(self.earlier, "--set", "minimum=91", "--record", self.directory / "again.jsonl")
+        self.assertEqual(result.returncode, 1, result.stderr)
+        stages = {event["stage"] for event in events_in(self.directory / "again.jsonl") if "stage" in event}
+        self.assertIn("analyze", stages)
+        self.assertNotIn("analyse", stages)
+
+    def test_it_does_not_differ_from_a_record_of_today(self):
+        result = quazor("diff", self.earlier, self.record)
+        self.assertEqual((result.returncode, result.stdout), (0, "The records do not differ.\n"))
+
+    def test_where_an_error_came_from_is_read(self):
+        self.recorded("--set", "analysis.behaviour=22", code=2)
+        failing = self.changed(self.rename)
+        self.assert_verifies(failing)
+        result = quazor("diff", failing, self.record)
+        self.assertEqual((result.returncode, result.stdout), (0, "The records do not differ.\n"))
+
+
+if __name__ == "__main__":
+    unittest.main()
