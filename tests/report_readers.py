@@ -26,8 +26,10 @@ def number(text):
 
 
 def printable(text):
-    """Escapes control characters as \\xNN, as in user-readable text."""
-    return re.sub("[\x00-\x1f\x7f-\x9f]", lambda found: f"\\x{ord(found[0]):02x}", text)
+    """Escapes control characters and marks of direction as \\xNN, as in user-readable text."""
+    escaped = re.sub("[\x00-\x1f\x7f-\x9f]", lambda found: f"\\x{ord(found[0]):02x}", text)
+    return re.sub("[\u061c\u200e\u200f\u202a-\u202e\u2066-\u2069]",
+                  lambda found: "".join(f"\\x{byte:02x}" for byte in found[0].encode()), escaped)
 
 
 def blurred(value):

@@ -19,13 +19,6 @@ namespace quazor {
 
 namespace {
 
-// Default memory limit of a plug-in process: more than any diagnostic needs, less than a bench machine has.
-constexpr std::uint64_t kMebibyte = std::uint64_t{1024} * 1024;
-constexpr std::uint64_t kDefaultMebibytes = 4096;
-// The largest limits on a diagnostic's log, other than none. A larger number is more likely a mistake.
-constexpr std::uint64_t kMaxLogLines = 1'000'000'000;
-constexpr std::uint64_t kMaxLogMebibytes = 1'048'576;
-
 // Arguments as CLI11 collects them, before validation.
 struct RawOptions {
   std::vector<std::string> names;
@@ -201,44 +194,6 @@ void addRunOptions(CLI::App& command, RawOptions& raw, const std::string& what) 
 
 void addRecords(CLI::App& command, RawOptions& raw, int least, int most, const std::string& what) {
   command.add_option("RECORD", raw.records, what)->type_name("")->required()->expected(least, most);
-}
-
-std::uint64_t parseWhole(const char* option, const std::string& text, std::uint64_t least, std::uint64_t most) {
-  std::uint64_t number = 0;
-  const auto [end, error] = std::from_chars(text.data(), text.data() + text.size(), number);
-  if (error != std::errc() || end != text.data() + text.size() || number < least || number > most) {
-    throw CommandError(ExitCode::kUsage, std::string(option) + " '" + text + "': expected an integer from " +
-                                             std::to_string(least) + " to " + std::to_string(most));
-  }
-  return number;
-}
-
-std::optional<std::uint64_t> memoryOf(const std::string& text) {
-  if (text == "none") return std::nullopt;
-  if (!text.empty()) return parseWhole("--memory", text, 1, UINT64_MAX / kMebibyte) * kMebibyte;
-#if defined(QUAZOR_ADDRESS_SANITIZER) || defined(QUAZOR_THREAD_SANITIZER)
-  return std::nullopt;  // sanitizers reserve a larger address space than any limit
-#else
-  return kDefaultMebibytes * kMebibyte;
-#endif
-}
-
-LogLimit logLimitOf(const std::string& text) {
-  LogLimit limit;
-  if (text.empty()) return limit;
-  if (text == "none") return LogLimit::none();
-  const std::size_t comma = text.find(',');
-  limit.lines = parseWhole("--log-limit: LINES", text.substr(0, comma), 1, kMaxLogLines);
-  if (comma == std::string::npos) return limit;
-  limit.bytes = parseWhole("--log-limit: MEBIBYTES", text.substr(comma + 1), 1, kMaxLogMebibytes) * kMebibyte;
-  return limit;
-}
-
-std::optional<LogLevel> logLevelOf(const std::string& text) {
-  if (text == "error") return LogLevel::kError;
-  if (text == "default") return LogLevel::kDefault;
-  if (text == "debug") return LogLevel::kDebug;
-  return std::nullopt;
 }
 
 // CLI11 accepts an empty option value; quazor does not.

@@ -74,6 +74,8 @@ void describeForProfiles(const Options& options, const Installation& installatio
     }
     return;
   }
+  std::optional<WatchedSignals> own;
+  if (signals == nullptr) signals = &own.emplace();
   if (!describeIsolated(isolationOf(options, installation), *signals, undescribed, catalogue)) refuseInterrupted();
 }
 
@@ -116,8 +118,8 @@ PluginScan scanOf(const Options& options, const Installation& installation, cons
     for (const Diagnostic& one : catalogue) scan.catalogue.push_back({one, describeIfWanted(one, wanted)});
     return scan;
   }
-  std::optional<WatchedSignals> ofScan;
-  if (signals == nullptr) signals = &ofScan.emplace();
+  std::optional<WatchedSignals> own;
+  if (signals == nullptr) signals = &own.emplace();
   scan = scanPlugins(isolation, *signals, described);
   if (signals->requestsToEnd() > 0) refuseInterrupted();
   return scan;

@@ -77,7 +77,7 @@ TEST(Csv, KeepsTextsFromBeingTakenForFormulas) {
     diagnostic.measuredResults.push_back(judgeResult(result));
     const std::string csv = diagnosticCsv({diagnostic});
     EXPECT_EQ(csv.substr(csv.find('\n') + 1), std::string(cell) + ",error," + cell + ",-2," + cell + ',' + cell +
-                                                  ",,,,,none,," + cell + ",-7," + cell + '\n')
+                                                  ",,,,,none,analyze," + cell + ",-7," + cell + '\n')
         << text;
   }
 }

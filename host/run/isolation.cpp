@@ -69,9 +69,7 @@ class IsolatedRun {
     supervision.takeOutput = [this](std::string_view line) { takeOutput(line); };
     supervision.deadline = [this] { return deadline_; };
     // A process that is about to end may do so before an interrupt ends it.
-    supervision.isDone = [this, &signals, before = signals.requestsToEnd()] {
-      return order_.isCompleted() && signals.requestsToEnd() > before;
-    };
+    supervision.isDone = [this, &signals] { return order_.isCompleted() && signals.requestsToEnd() > 0; };
     supervision.mayFinish = [this] { return interrupt(); };
     supervision.tick = [this] { progress_.update(); };
     return supervision;
@@ -85,6 +83,7 @@ class IsolatedRun {
     if (droppedLines_ > 0) log(formatMessage("%@ more lines of output were dropped", droppedLines_));
     if (isInterrupted()) {  // the failure was told at once
       if (!order_.isCompleted()) tellAboutTeardown();
+      if (order_.isCompleted() && endedWell({SupervisionEnd::kEnded, end.end})) events_.onEvent(DiagnosticCompleted{});
       return;
     }
     if (order_.isCompleted() && endedWell(end)) {
@@ -226,7 +225,6 @@ bool superviseRun(const IsolationOptions& options, WatchedSignals& signals, cons
                   const ResolvedParameters& parameters, const std::function<void(RunEventSink& toParent)>& body,
                   SharedRunState& shared, Progress& progress, RunEventSink& events) {
   const Deadlines deadlines(parameters, options.deadlines);
-  const int requestsBefore = signals.requestsToEnd();
   std::string token;
   const auto speak = [&body, &token](int descriptor) {
     const ConnectionWriter connection(descriptor, token);
@@ -246,7 +244,7 @@ bool superviseRun(const IsolationOptions& options, WatchedSignals& signals, cons
   IsolatedRun run(diagnostic, deadlines, options.grace, token, shared.interrupted, progress, events);
   Supervised end = supervise(*child, signals, run.supervision(signals));
   child.reset();  // ends what the process has left behind
-  end = withInterrupt(end, run.isCompleted() && signals.requestsToEnd() > requestsBefore);
+  end = withInterrupt(end, run.isCompleted() && signals.requestsToEnd() > 0);
   run.conclude(end, shared.leftOut.get());
   return end.how != SupervisionEnd::kInterrupted;
 }

@@ -303,7 +303,6 @@ IsolationOptions withoutFailed(IsolationOptions options, const std::vector<Faile
 
 PluginScan scanPlugins(const IsolationOptions& options, WatchedSignals& signals, const DiagnosticChoice& described) {
   const Deadlines deadlines({}, options.deadlines);
-  const int requestsBefore = signals.requestsToEnd();
   const std::vector<std::filesystem::path> files = distinctFiles(options.plugins);
   for (const std::filesystem::path& file : files) checkFile(file);
   PluginScan scan;
@@ -312,7 +311,7 @@ PluginScan scanPlugins(const IsolationOptions& options, WatchedSignals& signals,
   for (const std::filesystem::path& file : files) {
     PluginLoading loading(options, deadlines, file);
     DiagnosticErrorPtr error = loading.perform(signals);
-    scan.interrupted = signals.requestsToEnd() > requestsBefore;
+    scan.interrupted = signals.requestsToEnd() > 0;
     if (scan.interrupted) return scan;
     if (error != nullptr) {
       scan.failed.push_back({file, std::move(error)});
@@ -335,7 +334,6 @@ PluginScan scanPlugins(const IsolationOptions& options, WatchedSignals& signals,
 bool describeIsolated(const IsolationOptions& options, WatchedSignals& signals, const std::vector<Diagnostic>& wanted,
                       std::vector<DescribedDiagnostic>& catalogue) {
   const Deadlines deadlines({}, options.deadlines);
-  const int requestsBefore = signals.requestsToEnd();
   std::vector<DescribedDiagnostic*> left;
   for (DescribedDiagnostic& one : catalogue) {
     if (contains(wanted, one.diagnostic)) left.push_back(&one);
@@ -347,7 +345,7 @@ bool describeIsolated(const IsolationOptions& options, WatchedSignals& signals, 
     });
     Describing describing(options, deadlines, {left.begin(), others});
     std::vector<DescribedDiagnostic*> next = describing.perform(signals);
-    if (signals.requestsToEnd() > requestsBefore) return false;
+    if (signals.requestsToEnd() > 0) return false;
     next.insert(next.end(), others, left.end());
     left = std::move(next);
   }
