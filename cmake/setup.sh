@@ -92,6 +92,15 @@ show_progress() {
 # build DIRECTORY TARGETS CMAKE_OPTION...: configures once and builds, with progress; prints the output of the build
 # only if it fails.
 build() {
+  local mask status=0
+  mask=$(umask)
+  umask g-w,o-w  # plug-ins that others may change are refused
+  build_unshared "$@" || status=$?
+  umask "$mask"
+  return $status
+}
+
+build_unshared() {
   local directory=$1 targets=$2
   shift 2
   check_cmake || return 1
