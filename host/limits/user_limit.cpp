@@ -266,7 +266,7 @@ std::string canonicalText(const UserLimit& limit) {
 
 std::string labelOf(const UserLimit& limit) {
   const std::string name = limit.name.empty() ? std::string() : limit.name + ": ";
-  return name + canonicalText(limit) + " (" + limit.source + ")";
+  return name + nameText(limit.result, true) + " " + conditionText(limit) + " (" + limit.source + ")";
 }
 
 std::string conditionText(const UserLimit& limit) {

@@ -78,7 +78,7 @@ std::string canonicalText(const UserLimit& limit);
 // The canonical text without the diagnostic and the result, for example ">= 90 frames".
 std::string conditionText(const UserLimit& limit);
 
-// The name, if there is one, the canonical text and the source, for reports.
+// The name, if there is one, the canonical text without the diagnostic, and the source: for the report of a diagnostic.
 std::string labelOf(const UserLimit& limit);
 
 }  // namespace quazor

@@ -132,6 +132,14 @@ TEST(UserLimit, IsReadBackFromItsCanonicalText) {
   }
 }
 
+TEST(UserLimit, HasALabelWithItsNameAndSource) {
+  UserLimit limit = parseUserLimit("D*:\"A:B\" > 1 V");
+  limit.source = "command line";
+  EXPECT_EQ(labelOf(limit), "\"A:B\" > 1 V (command line)");
+  limit.name = "enough";
+  EXPECT_EQ(labelOf(limit), "enough: \"A:B\" > 1 V (command line)");
+}
+
 TEST(UserLimit, NamesItsSeverity) {
   EXPECT_EQ(limitSeverityNamed("fail"), LimitSeverity::kFail);
   EXPECT_EQ(limitSeverityNamed("warn"), LimitSeverity::kWarn);
