@@ -103,7 +103,7 @@ int ReplacementFile::inherit(const struct stat& replaced) const {
   if (own.st_uid != replaced.st_uid) {
     if (::fchown(descriptor_, replaced.st_uid, replaced.st_gid) != 0) return errno;
   } else if (own.st_gid != replaced.st_gid && ::fchown(descriptor_, own.st_uid, replaced.st_gid) != 0) {
-    mode &= ~(S_IRWXG | S_ISGID);  // they were meant for another group
+    mode &= ~mode_t{S_IRWXG | S_ISGID};  // they were meant for another group
   }
   return ::fchmod(descriptor_, mode) == 0 ? 0 : errno;
 }
