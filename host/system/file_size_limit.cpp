@@ -6,7 +6,7 @@ namespace quazor {
 
 namespace {
 
-struct sigaction before {};
+struct sigaction actionBefore {};
 bool isChanged = false;
 
 }  // namespace
@@ -14,11 +14,11 @@ bool isChanged = false;
 void failWritesBeyondFileSizeLimit() {
   struct sigaction ignored {};
   ignored.sa_handler = SIG_IGN;
-  if (!isChanged) isChanged = ::sigaction(SIGXFSZ, &ignored, &before) == 0;
+  if (!isChanged) isChanged = ::sigaction(SIGXFSZ, &ignored, &actionBefore) == 0;
 }
 
 void restoreFileSizeSignal() {
-  if (isChanged) ::sigaction(SIGXFSZ, &before, nullptr);
+  if (isChanged) ::sigaction(SIGXFSZ, &actionBefore, nullptr);
   isChanged = false;
 }
 

@@ -1,4 +1,4 @@
-// Arbitrary lines as what a process says that scans plug-ins: each is a diagnostic or a description that is the same
+// Arbitrary lines as what a process says that scans plug-ins: each is a registration or a description that is the same
 // when it is said again, or is refused.
 #include "base/json/json_line.h"
 #include "host/plugin/diagnostic_registry.h"
@@ -7,6 +7,9 @@
 #include "host/record/run_event_json.h"
 #include "tests/fuzz/fuzzing.h"
 
+#include <algorithm>
+#include <cstddef>
+#include <cstdint>
 #include <optional>
 #include <string>
 #include <vector>
@@ -18,14 +21,22 @@ using Json = nlohmann::ordered_json;
 
 std::string said(const Json& json) { return json.dump(-1, ' ', false, Json::error_handler_t::replace); }
 
-std::optional<Diagnostic> requireDiagnostic(const Json& json) {
-  std::optional<Diagnostic> diagnostic = accepted([&] { return diagnosticFrom(json); });
-  if (!diagnostic) return diagnostic;
-  const std::string line = said(diagnosticJson(*diagnostic));
-  const Diagnostic again = diagnosticFrom(parseJsonLine(line));
-  require(said(diagnosticJson(again)) == line, "a diagnostic is the same when it is said again");
-  require(contains({again}, *diagnostic) && matchesName(again.name, diagnostic->name), "its name is the same");
-  return diagnostic;
+std::optional<QZLab::Registration> requireRegistration(const Json& json) {
+  std::optional<QZLab::Registration> registration = accepted([&] { return registrationFrom(json); });
+  if (!registration) return registration;
+  const std::string line = said(registrationJson(*registration));
+  require(said(registrationJson(registrationFrom(parseJsonLine(line)))) == line,
+          "a registration is the same when it is said again");
+  return registration;
+}
+
+void add(const QZLab::Registration& one, QZLab& lab) {
+  switch (one.kind) {
+    case QZLab::Kind::kExperiment: lab.addExperimentWithName(one.name, nullptr); return;
+    case QZLab::Kind::kAnalysis: lab.addAnalysisWithName(one.name, nullptr); return;
+    case QZLab::Kind::kDiagnostic:
+      lab.addDiagnosticWithName(one.name, one.summary, one.experimentName, one.analysisName);
+  }
 }
 
 std::optional<DiagnosticDescription> requireDescription(const Json& json) {
@@ -57,17 +68,21 @@ void requireCatalogue(const std::vector<Diagnostic>& diagnostics, const std::vec
 
 extern "C" int LLVMFuzzerTestOneInput(const std::uint8_t* data, std::size_t size) {
   using namespace quazor;
-  std::vector<Diagnostic> diagnostics;
-  std::vector<DescribedDiagnostic> described;
+  QZLab lab;
+  std::vector<DiagnosticDescription> descriptions;
   for (const std::string& line : linesOf(asText(data, size))) {
     const std::optional<Json> json = accepted([&] { return parseJsonLine(line); });
     if (!json) break;  // the host ends the process
-    if (std::optional<Diagnostic> diagnostic = requireDiagnostic(*json)) {
-      diagnostics.push_back(*std::move(diagnostic));
+    if (const std::optional<QZLab::Registration> registration = requireRegistration(*json)) {
+      add(*registration, lab);
     } else if (std::optional<DiagnosticDescription> description = requireDescription(*json)) {
-      if (described.size() == diagnostics.size()) break;
-      described.push_back({diagnostics[described.size()], *std::move(description)});
+      descriptions.push_back(*std::move(description));
     }
+  }
+  const std::vector<Diagnostic> diagnostics = catalogueOf(lab);
+  std::vector<DescribedDiagnostic> described;
+  for (std::size_t i = 0; i < std::min(diagnostics.size(), descriptions.size()); ++i) {
+    described.push_back({diagnostics[i], descriptions[i]});
   }
   requireCatalogue(diagnostics, described);
   return 0;

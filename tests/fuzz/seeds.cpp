@@ -106,9 +106,13 @@ void writeConnections(const fs::path& folder) {
 }
 
 void writeScans(const fs::path& folder) {
-  const Diagnostic diagnostic{"Sync.Back", "A summary.", "SyncExperiment",    "SyncAnalysis", nullptr, nullptr,
-                              false,       {},           {"one.so", "two.so"}};
-  const Diagnostic experiment{"Images", "", "Images", "", nullptr, nullptr, true, {"Sync.Back"}, {"one.so"}};
+  QZLab lab;
+  lab.addExperimentWithName("SyncExperiment", nullptr);
+  lab.addAnalysisWithName("SyncAnalysis", nullptr);
+  lab.addDiagnosticWithName("Sync.Back", "A summary.", "SyncExperiment", "SyncAnalysis");
+  lab.addExperimentWithName("Images", nullptr);
+  std::string registrations;
+  for (const QZLab::Registration& one : lab.registrations()) registrations += lineOf(registrationJson(one));
   DiagnosticDescription described;
   described.experiment = QZDescription("What it measures.");
   described.experiment.addParameter(QZNumberParameter("How long.", true), "duration");
@@ -117,9 +121,8 @@ void writeScans(const fs::path& folder) {
   failed.error = errorWithMessage("Domain", 7, "No description.", nullptr);
   failed.isAsked = false;
   const Seeds scans(folder, "scan");
-  scans.add("two", lineOf(diagnosticJson(diagnostic)) + lineOf(diagnosticJson(experiment)) +
-                       lineOf(descriptionJson(described)) + lineOf(descriptionJson(failed)));
-  scans.add("one", lineOf(diagnosticJson(experiment)) + lineOf(descriptionJson(failed)));
+  scans.add("two", registrations + lineOf(descriptionJson(described)) + lineOf(descriptionJson(failed)));
+  scans.add("one", lineOf(registrationJson(lab.registrations().back())) + lineOf(descriptionJson(failed)));
 }
 
 void writeCommandLines(const fs::path& folder) {
