@@ -22,7 +22,8 @@ namespace quazor::fake {
 
 namespace {
 
-const std::string kName = MOODY_NAME;
+// No std::string, which the initializer below could come before.
+constexpr const char* kName = MOODY_NAME;
 
 bool is(const char* mood) {
   std::string variable = kName;
@@ -66,11 +67,11 @@ class MoodyExperiment final : public FakeExperiment {
   if (is("mortal")) dieInsteadOfExiting();
   if (is("mute")) return;
   QZLab& lab = QZLab::defaultLab();
-  lab.addExperimentWithName(is("renamed") ? kName + "Renamed" : kName,
+  lab.addExperimentWithName(is("renamed") ? std::string(kName) + "Renamed" : std::string(kName),
                             [] { return std::make_shared<MoodyExperiment>(); });
   if (is("combining")) {  // with the experiment of the plug-in Moody
-    lab.addAnalysisWithName(kName + "Analysis", [] { return std::make_shared<FakeAnalysis>(); });
-    lab.addDiagnosticWithName("Both", "Needs two plug-ins.", "Moody", kName + "Analysis");
+    lab.addAnalysisWithName(std::string(kName) + "Analysis", [] { return std::make_shared<FakeAnalysis>(); });
+    lab.addDiagnosticWithName("Both", "Needs two plug-ins.", "Moody", std::string(kName) + "Analysis");
   }
 }
 
