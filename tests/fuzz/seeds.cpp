@@ -148,10 +148,12 @@ void writeSettings(const fs::path& folder) {
 // The headers of a shared object with three segments, and their bytes.
 void writeSharedObjects(const fs::path& folder) {
   Elf64_Ehdr header{};
-  std::memcpy(header.e_ident, ELFMAG, SELFMAG);
-  header.e_ident[EI_CLASS] = ELFCLASS64;
-  header.e_ident[EI_DATA] = ELFDATA2LSB;
-  header.e_ident[EI_VERSION] = EV_CURRENT;
+  // The identification and the machine are those of this program; other files are refused at once.
+  std::ifstream program("/proc/self/exe", std::ios::binary);
+  Elf64_Ehdr own{};
+  program.read(reinterpret_cast<char*>(&own), sizeof own);
+  std::memcpy(header.e_ident, own.e_ident, sizeof header.e_ident);
+  header.e_machine = own.e_machine;
   header.e_type = ET_DYN;
   header.e_phoff = sizeof header;
   header.e_phentsize = sizeof(Elf64_Phdr);

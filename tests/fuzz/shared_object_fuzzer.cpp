@@ -1,13 +1,17 @@
-// Arbitrary bytes as a plug-in's file: it is accepted if and only if the file contains every segment of its headers.
+// Arbitrary bytes as a plug-in's file: it is accepted if and only if it is built for this program's architecture
+// and contains every segment of its headers.
 #include "host/plugin/shared_object.h"
 #include "tests/fuzz/fuzzing.h"
 
 #include <elf.h>
 
 #include <algorithm>
+#include <cstddef>
 #include <cstring>
+#include <fstream>
 #include <optional>
 #include <random>
+#include <string>
 
 extern "C" std::size_t LLVMFuzzerMutate(std::uint8_t* data, std::size_t size, std::size_t maxSize);
 
@@ -36,8 +40,24 @@ bool hasSegments(const std::uint8_t* data, std::size_t size) {
   return true;
 }
 
+// The header of this program.
+const std::string& ownHeader() {
+  static const std::string header = [] {
+    std::ifstream program("/proc/self/exe", std::ios::binary);
+    std::string bytes(sizeof(Elf64_Ehdr), '\0');
+    program.read(bytes.data(), static_cast<std::streamsize>(bytes.size()));
+    require(program.good(), "this program can be read");
+    return bytes;
+  }();
+  return header;
+}
+
 bool isSharedObject(const std::uint8_t* data, std::size_t size) {
-  if (size < EI_NIDENT || std::memcmp(data, ELFMAG, SELFMAG) != 0) return false;
+  if (size < offsetof(Elf64_Ehdr, e_version) || std::memcmp(data, ELFMAG, SELFMAG) != 0) return false;
+  for (const std::size_t place : {std::size_t{EI_CLASS}, std::size_t{EI_DATA}, offsetof(Elf64_Ehdr, e_machine),
+                                  offsetof(Elf64_Ehdr, e_machine) + 1}) {
+    if (data[place] != static_cast<std::uint8_t>(ownHeader()[place])) return false;
+  }
   return data[EI_CLASS] != ELFCLASS64 || hasSegments(data, size);
 }
 
@@ -99,7 +119,8 @@ extern "C" int LLVMFuzzerTestOneInput(const std::uint8_t* data, std::size_t size
   static const MemoryFile file("plugin.so");
   file.write(data, size);
   const bool isAccepted = accepted([] { return validateSharedObject(file.path()), true; }).has_value();
-  require(isAccepted == isSharedObject(data, size), "a file is accepted exactly if it has all of its segments");
+  require(isAccepted == isSharedObject(data, size),
+          "a file is accepted exactly if it is of this architecture and has all of its segments");
   return 0;
 }
 
