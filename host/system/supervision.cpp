@@ -19,6 +19,9 @@ using SteadyClock = std::chrono::steady_clock;
 constexpr std::chrono::milliseconds kTick = 100ms;
 // How long a finished child may take to exit, and any child after SIGTERM.
 constexpr std::chrono::milliseconds kGrace = 500ms;
+// How long a child that has closed its connection may take to exit, if its deadline is not sooner. On a busy machine
+// the system needs a while to end a process.
+constexpr std::chrono::seconds kClosing = 5s;
 // How long to wait for a killed process: one that is blocked in the kernel does not end.
 constexpr std::chrono::seconds kMaxDeath = 5s;
 constexpr std::size_t kMaxOutputLength = 1U << 16;
@@ -153,7 +156,7 @@ class Supervisor {
     } else if (connection_.atEnd()) {
       // A process closes its connection shortly before it ends.
       how_ = SupervisionEnd::kConnectionLost;
-      limit_ = now + kGrace;
+      limit_ = std::max<Moment>(now + kGrace, std::min<Moment>(now + kClosing, supervision_.deadline()));
       endsByItself_ = true;
     } else if (now >= supervision_.deadline()) {
       beginEnding(SupervisionEnd::kDeadline, now);
