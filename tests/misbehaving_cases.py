@@ -13,7 +13,7 @@ LATER_CRASH_DIAGNOSTIC = "Loaded.crashAfterTheFirstTime"
 STAGES = ("load", "describe", "setup", "run", "teardown", "analyze")
 LIMIT = 1  # seconds, for a stage that hangs
 GRACE = 0.5  # seconds between SIGTERM and SIGKILL
-MARGIN = 3.0  # seconds on an idle machine; multiplied by the slowdown of a busy one
+MARGIN = 5.0  # seconds on an idle machine; multiplied by the slowdown of a busy one
 MEMORY = 256  # mebibytes
 MANY = 1_000_000 if os.environ.get("QUAZOR_THOROUGH") == "1" else 5_000
 

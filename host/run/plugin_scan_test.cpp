@@ -219,7 +219,7 @@ TEST_F(PluginScanTest, LoadsAFileThatIsListedTwiceOnce) {
 }
 
 TEST_F(PluginScanTest, GivesEachPluginADeadlineOfItsOwn) {
-  options_.deadlines = {{Stage::kLoad, 1200ms}};  // less than both plug-ins need together
+  options_.deadlines = {{Stage::kLoad, 3500ms}};  // less than both plug-ins need together
   const EnvironmentVariable moody("MOODY", "slow");
   const EnvironmentVariable sullen("SULLEN", "slow, combining");
   const PluginScan all = scan({"moody", "sullen"});

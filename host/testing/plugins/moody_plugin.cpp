@@ -59,7 +59,7 @@ class MoodyExperiment final : public FakeExperiment {
 };
 
 [[gnu::constructor]] void registerMoody() {
-  if (is("slow")) std::this_thread::sleep_for(std::chrono::milliseconds(700));
+  if (is("slow")) std::this_thread::sleep_for(std::chrono::seconds(2));
   if (is("hanging")) std::this_thread::sleep_for(std::chrono::hours(1));
   if (is("aborting")) std::abort();
   if (is("ticking")) std::thread(abortSoon).detach();
