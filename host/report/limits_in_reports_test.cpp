@@ -1,4 +1,5 @@
 // The limits of the user in every report.
+#include "host/error/host_error.h"
 #include "host/model/judge.h"
 #include "host/report/record_difference.h"
 #include "host/report/report_format.h"
@@ -98,6 +99,19 @@ TEST(LimitsInReports, AreValidatorsAndDiagnosesOfOcp) {
   EXPECT_THAT(lineWith(ocp, "Count-limit-fail"), HasSubstr(R"("type":"FAIL")"));
   EXPECT_THAT(lineWith(ocp, "Count-limit-pass"), HasSubstr(R"("type":"PASS")"));
   EXPECT_THAT(lineWith(ocp, "\"WARNING\""), HasSubstr("Count is 90 frames, limit Count < Offset (command line)"));
+}
+
+TEST(LimitsInReports, StandInTheCommandThatRepeatsTheRun) {
+  const std::string ocp = reportOf(Format::kOcp, limitedRecord());
+  // A warning would become a failure there.
+  EXPECT_THAT(ocp, HasSubstr("--limit 'Count >= 80' --limit 'Count == 80 +- 2'\""));
+  RunStarted run;
+  run.names = {"Good"};
+  DiagnosticRecord without;
+  without.name = "Cuont > 1";
+  without.error = hostError(HostErrorCode::kLimitWithoutResult, "it fits nothing");
+  EXPECT_THAT(reportText(Format::kOcp, run, {without}, std::nullopt),
+              HasSubstr("\"quazor run Good --seed 0 --profile none --limit 'Cuont > 1'\""));
 }
 
 TEST(LimitsInReports, AreErrorsWhereTheyCannotBeCompared) {

@@ -11,6 +11,8 @@
 
 #include <algorithm>
 #include <iterator>
+#include <set>
+#include <string>
 #include <string_view>
 #include <utility>
 
@@ -67,6 +69,23 @@ std::string commandOf(const RunStarted& run, const std::vector<std::string>& nam
   line += " --profile none";
   addSettings(line, "experiment", parameters.experiment);
   addSettings(line, "analysis", parameters.analysis);
+  return line;
+}
+
+// The command that repeats the run of one record, with the limits of the user that decide its verdict. The record of a
+// limit without a result repeats the whole run with that limit.
+std::string commandOf(const RunStarted& run, const DiagnosticRecord& record) {
+  if (isOfLimit(record)) {
+    std::string line = commandOf(run, run.names, {});
+    addWord(line, " --limit ", record.name);
+    return line;
+  }
+  std::string line = commandOf(run, {record.name}, record.parameters);
+  std::set<std::string> limits;
+  for (const LimitCheck& check : limitChecksOf(record)) {
+    const std::string text = canonicalText(check.limit);
+    if (check.counts() && limits.insert(text).second) addWord(line, " --limit ", text);
+  }
   return line;
 }
 
@@ -197,7 +216,7 @@ class OcpRecordWriter {
     RunStarted ofRecord = run_;
     ofRecord.seed = record_.seed;
     ofRecord.ofExperiments = record_.experimentOnly;
-    std::string command = commandOf(ofRecord, {record_.name}, record_.parameters);
+    std::string command = commandOf(ofRecord, record_);
     stream_.addToRun("testRunStart",
                      startJson(ofRecord, record_.name, std::move(command), record_.parameters, std::move(metadata)),
                      record_.begin);
