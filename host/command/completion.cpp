@@ -67,12 +67,22 @@ class Completer {
     if (option == "--only") return {"failed"};
     if (option == "--log-limit" || option == "--memory") return {"none"};
     if (option == "--phone") return phones();
+    if (option == "--plugin") return plugins();
     if (option == "--deadline") {
       std::vector<std::string> stages;
       for (const Stage stage : kStages) stages.push_back(std::string(nameOf(stage)) + "=");
       return stages;
     }
     return option == "--set" ? parameters() : std::vector<std::string>();
+  }
+
+  std::vector<std::string> plugins() const {
+    std::vector<std::string> names;
+    try {
+      for (const std::filesystem::path& file : installation_.allPlugins()) names.push_back(file.stem().string());
+    } catch (const InputError&) {  // a folder cannot be read; the command itself says so
+    }
+    return names;
   }
 
   std::vector<std::string> phones() const {
@@ -108,10 +118,10 @@ class Completer {
 
   std::vector<DescribedDiagnostic> catalogue(bool described) const {
     Options options;
-    for (std::size_t i = 1; i + 1 < words_.size(); ++i) {
-      if (words_[i] == "--plugin") options.plugins.emplace_back(words_[i + 1]);
-    }
     try {
+      for (std::size_t i = 1; i + 1 < words_.size(); ++i) {
+        if (words_[i] == "--plugin") options.plugins.push_back(installation_.plugin(words_[i + 1]));
+      }
       std::vector<DescribedDiagnostic> all =
           scanOf(options, installation_, [described](const std::vector<Diagnostic>& everything) {
             return described ? everything : std::vector<Diagnostic>();
