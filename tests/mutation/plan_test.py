@@ -222,15 +222,26 @@ class JudgeTest(unittest.TestCase):
     FOLDER = plan.Folder("x", (), ("a_test",), ("b_test", "script_test"))
     MUTANT = Mutant("a.cpp", "constant", 0, 1, "2", "1", "2")
 
-    def judge(self, fake, first=0, count=run.STEPS):
+    def judge(self, fake, first=0, count=run.STEPS, folder=FOLDER, mutant=MUTANT):
         tests, targets = {"a_test", "b_test", "script_test"}, {"a_test", "b_test"}
-        return run.Judge(fake, tests, targets).judge(self.FOLDER, self.MUTANT, first, count)
+        return run.Judge(fake, tests, targets).judge(folder, mutant, first, count)
 
     def test_a_survivor_passes_every_step(self):
         fake = FakeLaboratory()
         self.assertEqual(self.judge(fake), ("survived", ""))
         self.assertEqual(fake.steps, [("make", ("a_test",)), ("test", "^(a_test)$"), ("make", ()),
                                             ("test", "^(b_test|script_test)$"), ("make", ()), ("test", "")])
+
+    def test_the_test_of_the_files_folder_judges_first(self):
+        folder = plan.Folder("x", (), ("a_test", "b_test"), ("script_test",))
+        mutant = Mutant("x/b/some.cpp", "constant", 0, 1, "2", "1", "2")
+        fake = FakeLaboratory()
+        self.assertEqual(self.judge(fake, 0, 1, folder, mutant), ("killed", "b_test (Failed)"))
+        self.assertEqual(fake.steps[:2], [("make", ("b_test",)), ("test", "^(b_test)$")])
+        fake = FakeLaboratory(times=0)
+        self.assertEqual(self.judge(fake, 0, 1, folder, mutant), (run.OPEN, ""))
+        self.assertEqual(fake.steps, [("make", ("b_test",)), ("test", "^(b_test)$"), ("make", ("a_test",)),
+                                      ("test", "^(a_test)$")])
 
     def test_the_first_failure_kills(self):
         fake = FakeLaboratory(failing="^(a_test)$")
