@@ -218,6 +218,18 @@ class OutputTest(unittest.TestCase):
         self.assertEqual(run.FAILED_TEST.findall(summary), [("one_test", "Failed"), ("two_test", "Timeout")])
 
 
+class LaboratoryTest(unittest.TestCase):
+    def test_a_test_that_exceeds_its_time_is_ended(self):
+        with tempfile.TemporaryDirectory() as folder:
+            work = pathlib.Path(folder)
+            one = laboratory.Laboratory(work, work, 1, [])
+            one.build.mkdir(parents=True)
+            (one.build / "CTestTestfile.cmake").write_text("add_test(hangs sleep 100)\n", encoding="utf-8")
+            passed, output = one.test("hangs", 1, 60)
+            self.assertFalse(passed)
+            self.assertEqual(run.FAILED_TEST.findall(output), [("hangs", "Timeout")])
+
+
 class JudgeTest(unittest.TestCase):
     FOLDER = plan.Folder("x", (), ("a_test",), ("b_test", "script_test"))
     MUTANT = Mutant("a.cpp", "constant", 0, 1, "2", "1", "2")
@@ -267,6 +279,16 @@ class JudgeTest(unittest.TestCase):
             (False, "") if pattern == "^(b_test)$" and not fake.is_mutated else idle(pattern, each, limit))
         with self.assertRaises(run.BaselineError):
             self.judge(fake)
+
+    def test_nobody_waits_twice_for_a_timeout(self):
+        fake = FakeLaboratory(failing="^(a_test)$", reason="Timeout")
+        self.judge(fake, 0, 1)
+        self.assertEqual(fake.steps, [("make", ("a_test",)), ("test", "^(a_test)$")])
+
+    def test_a_step_that_exceeds_its_time_kills_unless_the_machine_is_busy(self):
+        fake = FakeLaboratory()
+        fake.test = lambda pattern, each, limit: (not fake.is_mutated and pattern == "^(a_test)$", "no summary")
+        self.assertEqual(self.judge(fake), ("killed", "all tests (Timeout)"))
 
     def test_some_of_the_steps_do_not_decide_about_a_survivor(self):
         self.assertEqual(self.judge(FakeLaboratory(), 0, 1), (run.OPEN, ""))

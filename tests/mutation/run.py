@@ -33,8 +33,9 @@ COUNT, SEED = 400, 20261122
 STEPS = 3  # a folder's own tests, those near it, the rest
 LEAST, LEAST_OF_FOLDER = 0.97, 0.95
 OWN_LIMIT, REST_LIMIT = 600, 3000  # seconds for the tests of one step
-EACH_LIMIT = 300  # seconds for one test
+OWN_EACH_LIMIT, REST_EACH_LIMIT = 120, 300  # seconds for one test
 ATTEMPTS = 3
+ALL_TESTS = "all tests"  # when the step exceeds its time, but none of its tests does
 BATCH = 10  # of one folder in a row, because a header that changes back is compiled everywhere
 OPEN = "passed its folder's tests"  # with --own: a later call continues
 FAILED_TEST = re.compile(r"^\s*\d+ - (\S+) \((.*)\)$", re.MULTILINE)
@@ -70,7 +71,8 @@ class Step:
     """Tests that judge together."""
     targets: tuple  # empty: all
     pattern: str
-    limit: int
+    each: int  # seconds for one test
+    limit: int  # seconds for all
 
 
 class Judge:
@@ -82,28 +84,39 @@ class Judge:
         self.targets = targets
         self.sound = set()  # the steps that pass without a mutant
 
-    def _step(self, names):
+    def _step(self, names, each):
         known = [name for name in names if name in self.tests]
         programs = [name for name in known if name in self.targets]
-        return Step(tuple(programs) if len(programs) == len(known) else (), f"^({'|'.join(known)})$", OWN_LIMIT)
+        return Step(tuple(programs) if len(programs) == len(known) else (), f"^({'|'.join(known)})$", each, OWN_LIMIT)
 
     def _steps(self, folder, mutant):
         """The steps of a judgement, each in parts: the first failure ends it, so what fails most often comes first."""
         nearest = plan.nearest(folder, mutant.file)
         own = [names for names in (nearest, [name for name in folder.own if name not in nearest]) if names]
-        return [self._step(names) for names in own], [self._step(folder.near)], [Step((), "", REST_LIMIT)]
+        return ([self._step(names, OWN_EACH_LIMIT) for names in own], [self._step(folder.near, REST_EACH_LIMIT)],
+                [Step((), "", REST_EACH_LIMIT, REST_LIMIT)])
+
+    @staticmethod
+    def _pattern_of(names):
+        return f"^({'|'.join(re.escape(name) for name in names)})$"
 
     def _failures(self, step):
-        """The tests that fail twice, as pairs of name and reason: once may be a matter of time on a busy machine."""
+        """The tests that fail twice, as pairs of name and reason: once may be a matter of time on a busy machine.
+
+        Nobody waits twice for a test that exceeds its time: whether the machine is busy shows without the mutant.
+        """
         for _ in range(ATTEMPTS):
-            passed, output = self.laboratory.test(step.pattern, EACH_LIMIT, step.limit)
+            passed, output = self.laboratory.test(step.pattern, step.each, step.limit)
             if passed:
                 return []
-            names = [name for name, _ in FAILED_TEST.findall(output)]
-            again = f"^({'|'.join(re.escape(name) for name in names)})$" if names else step.pattern
-            passed, output = self.laboratory.test(again, EACH_LIMIT, step.limit)
+            failed = FAILED_TEST.findall(output)
+            if any(why == "Timeout" for _, why in failed):
+                return failed
+            names = [name for name, _ in failed]
+            again = self._pattern_of(names) if names else step.pattern
+            passed, output = self.laboratory.test(again, step.each, step.limit)
             if not passed:
-                return FAILED_TEST.findall(output) or [("all tests", "Timeout")]
+                return FAILED_TEST.findall(output) or [(ALL_TESTS, "Timeout")]
         raise BaselineError(f"fails only now and then: {', '.join(names)}")
 
     def _require_baseline(self, step, again=False):
@@ -111,7 +124,7 @@ class Judge:
         if step in self.sound and not again:
             return
         built, output = self.laboratory.make(step.targets)
-        passed, output = self.laboratory.test(step.pattern, EACH_LIMIT, step.limit) if built else (False, output)
+        passed, output = self.laboratory.test(step.pattern, step.each, step.limit) if built else (False, output)
         if not passed:
             raise BaselineError(output[-3000:])
         self.sound.add(step)
@@ -127,8 +140,9 @@ class Judge:
                     return ("does not compile", "") if step in steps[0] else ("killed", "the build")
                 failed = self._failures(step)
             if any(why == "Timeout" for _, why in failed):  # unless the machine is busy
-                names = "|".join(re.escape(name) for name, _ in failed)
-                self._require_baseline(dataclasses.replace(step, pattern=f"^({names})$"), again=True)
+                names = [name for name, _ in failed if name != ALL_TESTS]
+                pattern = self._pattern_of(names) if names else step.pattern
+                self._require_baseline(dataclasses.replace(step, pattern=pattern), again=True)
             if failed:
                 return "killed", ", ".join(f"{name} ({why})" for name, why in failed)
         return ("survived" if first + count >= len(steps) else OPEN), ""
