@@ -149,7 +149,10 @@ TEST(CheckProfile, NamesAnEntryOfTheDiagnosticsBeforeOneOfTheExperiments) {
   const Profile profile = parseProfile(
       "some.json",
       R"({"schema": 1, "experiments": {"Image": {"images": 5}}, "diagnostics": {"Bakc": {"experiment": {"x": 3}}}})");
-  EXPECT_EQ(refusalOf(ExitCode::kCannotRead, [&] { checkProfile(profile, {sync(), imagesAlone()}); }),
+  EXPECT_EQ(refusalOf(ExitCode::kCannotRead,
+                      [&] {
+                        checkProfile(profile, {sync(), imagesAlone()});
+                      }),
             "the profile 'some.json' has an entry 'Bakc', which matches no diagnostic");
 }
 
