@@ -146,6 +146,10 @@ std::vector<fs::path> Installation::explanations() const {
 
 fs::path Installation::scenario(const fs::path& name) const { return dataFile("scenarios", name); }
 
+std::function<fs::path(const fs::path& name)> Installation::scenarioSource() const {
+  return [this](const fs::path& name) { return namedFile("scenarios", name); };
+}
+
 std::vector<std::string> Installation::scenarioNames() const { return dataNames("scenarios"); }
 
 fs::path Installation::binding(const fs::path& name) const { return dataFile("bindings", name); }
@@ -159,14 +163,20 @@ std::vector<fs::path> Installation::dataFolders(const char* kind) const {
   return folders;
 }
 
-fs::path Installation::dataFile(const char* kind, const fs::path& name) const {
-  if (isThere(name) || name.is_absolute()) return name;
+// Empty if there is none.
+fs::path Installation::namedFile(const char* kind, const fs::path& name) const {
   for (const fs::path& folder : dataFolders(kind)) {
     fs::path file = folder / name;
     file += ".json";
     if (isThere(file)) return file;
   }
-  return name;
+  return {};
+}
+
+fs::path Installation::dataFile(const char* kind, const fs::path& name) const {
+  if (isThere(name) || name.is_absolute()) return name;
+  const fs::path named = namedFile(kind, name);
+  return named.empty() ? name : named;
 }
 
 std::vector<std::string> Installation::dataNames(const char* kind) const {

@@ -2,6 +2,7 @@
 #pragma once
 
 #include <filesystem>
+#include <functional>
 #include <string>
 #include <vector>
 
@@ -56,6 +57,9 @@ class Installation {
   // Resolves the argument of `--phone`: returns `name` if that file exists, else the scenario of that name (for example
   // "camera_sync/start_refused") in the folders above if there is one, else `name` unchanged.
   std::filesystem::path scenario(const std::filesystem::path& name) const;
+  // The file of a scenario that another one is based on by its name: in the folders above; empty if there is none. The
+  // function refers to this object.
+  std::function<std::filesystem::path(const std::filesystem::path& name)> scenarioSource() const;
   // The names of all scenarios in these folders, sorted, as scenario() accepts them.
   std::vector<std::string> scenarioNames() const;
   // Resolves the NAME of `--phone linux:NAME` in the same way, among the bindings.
@@ -65,6 +69,7 @@ class Installation {
  private:
   std::vector<std::filesystem::path> pluginFolders() const;
   std::vector<std::filesystem::path> dataFolders(const char* kind) const;
+  std::filesystem::path namedFile(const char* kind, const std::filesystem::path& name) const;
   std::filesystem::path dataFile(const char* kind, const std::filesystem::path& name) const;
   std::vector<std::string> dataNames(const char* kind) const;
 

@@ -86,19 +86,19 @@ class Doctor {
   void checkPhones() {
     const std::vector<std::string> names = installation_.scenarioNames();
     check("backend", "simulated", [&] {
-      phonesOfScenario(installation_.defaultScenario(), false, 0)();
+      phonesOfScenario(installation_.defaultScenario(), false, 0, installation_.scenarioSource())();
       return "created the healthy phone; " + countText(names.size(), "phone") + " installed";
     });
     for (const std::string& name : names) {
       try {
-        summaryOfScenario(installation_.scenario(name));
+        summaryOfScenario(installation_.scenario(name), installation_.scenarioSource());
       } catch (const InputError& problem) {
         tell(false, "phone", name, problem.what());
       }
     }
     checkBindings();
     check("backend", "real time (--realtime)", [&] {
-      phonesOfScenario(installation_.defaultScenario(), true, 0)();
+      phonesOfScenario(installation_.defaultScenario(), true, 0, installation_.scenarioSource())();
       return std::string("created the healthy phone");
     });
   }

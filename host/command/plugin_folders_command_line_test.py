@@ -164,6 +164,30 @@ class UserDataTest(PluginFoldersTest):
         self.assertEqual(result.returncode, 0, result.stderr)
         self.assertIn("mine/one_camera", self.quazor("__complete", "run", "--phone", "mine").stdout.split())
 
+    def test_a_scenario_may_be_based_on_a_name_wherever_it_stands(self):
+        expected = {"TesselTelemonDiagnostic": {"verdict": "pass"}, "TesselFaultDiagnostic": None,
+                    "CameraSyncDiagnostic.Front": None, "NimbeImageExperiment": None}
+        self.write_data("scenarios/mine/base.json", {"base": "healthy", "title": "Mine", "expect": expected})
+        here = self.write("here.json", json.dumps({"base": "mine/base", "title": "Here"}))
+        for phone in ("mine/base", here):
+            with self.subTest(phone):
+                result = self.quazor("run", SHIPPED, "--phone", phone)
+                self.assertEqual(result.returncode, 0, result.stderr)
+                result = self.quazor("selftest", phone, "--seeds", "1")
+                self.assertEqual(result.returncode, 0, result.stdout + result.stderr)
+                self.assertIn("TesselTelemonDiagnostic", result.stdout)
+        self.assertNotIn("REFUSED", self.quazor("doctor").stdout)
+        unknown = self.write("unknown.json", json.dumps({"base": "helthy", "title": "Here"}))
+        self.assert_refused(self.quazor("run", SHIPPED, "--phone", unknown), 66, "unknown.json:1: base:",
+                            "the file does not exist")
+
+    def test_a_file_beside_a_scenario_is_its_base_before_an_installed_one_of_that_name(self):
+        self.write("healthy", json.dumps(SCENARIO))
+        phone = self.write("phone2.json", json.dumps({"base": "healthy", "title": "Small"}))
+        shutil.copy(WORKING, self.own)
+        result = self.quazor("run", SHIPPED, "--phone", phone)
+        self.assertNotEqual(result.returncode, 0)  # it has one camera only
+
     def test_a_profile_of_the_user(self):
         self.write_data("profiles/mine.json", {"schema": 1, "diagnostics": {SHIPPED: {"experiment": {"duration": 4}}}})
         result = self.quazor("describe", SHIPPED, "--profile", "mine")

@@ -187,7 +187,7 @@ std::string choosePhone(const Options& options, const Installation& installation
   }
   const std::filesystem::path scenario =
       options.phone.empty() ? installation.defaultScenario() : installation.scenario(options.phone);
-  *makePhone = phonesOfScenario(scenario, options.realTime, options.seed);
+  *makePhone = phonesOfScenario(scenario, options.realTime, options.seed, installation.scenarioSource());
   return scenario.string();
 }
 

@@ -54,7 +54,7 @@ class Selftest {
     std::vector<SelftestRow> rows;
     for (const std::string& name : wantedScenarios(options_, installation_)) {
       const std::filesystem::path file = installation_.scenario(name);
-      for (const ExpectedOutcome& expected : summaryOfScenario(file).expected) {
+      for (const ExpectedOutcome& expected : summaryOfScenario(file, installation_.scenarioSource()).expected) {
         SelftestRow row{name, expected, 0, 0, 0, {}, {}};
         for (std::uint64_t seed = 0; seed < options_.seeds; ++seed) {
           count(row, run(file, expected, seed));
@@ -109,7 +109,7 @@ class Selftest {
     const Diagnostic& diagnostic = described.diagnostic;
     const ResolvedParameters parameters = parametersOf(described, expected);
     RunOptions runOptions;
-    runOptions.makePhone = phonesOfScenario(file, false, seed);
+    runOptions.makePhone = phonesOfScenario(file, false, seed, installation_.scenarioSource());
     runOptions.logLevel = LogLevel::kError;
     RecordBuilder builder;
     builder.onEvent(DiagnosticStarted{diagnostic.name, described.summary(), diagnostic.experimentName,

@@ -68,17 +68,19 @@ struct ScenarioFile {
   std::vector<ExpectedOutcome> expected;
 };
 
-ScenarioFile readScenarioFile(const std::filesystem::path& file) {
-  Scenario scenario = readScenario(file);
+ScenarioFile readScenarioFile(const std::filesystem::path& file, const ScenarioSource& find) {
+  Scenario scenario = readScenario(file, find);
   std::vector<ExpectedOutcome> expected = readExpectedOutcomes(JsonCursor(*scenario.document));
   return {std::move(scenario), std::move(expected)};
 }
 
 }  // namespace
 
-PhoneMaker phonesOfScenario(const std::filesystem::path& file, bool realTime, std::uint64_t seed) {
+PhoneMaker phonesOfScenario(const std::filesystem::path& file, bool realTime, std::uint64_t seed,
+                            const ScenarioSource& find) {
   const PhoneTime time = realTime ? PhoneTime::kReal : PhoneTime::kVirtual;
-  return [scenario = read(readScenarioFile, file).scenario, time, seed] {
+  const auto readIt = [&find](const std::filesystem::path& one) { return readScenarioFile(one, find); };
+  return [scenario = read(readIt, file).scenario, time, seed] {
     return std::make_unique<PhoneOfScenario>(scenario, time, seed);
   };
 }
@@ -104,8 +106,9 @@ std::shared_ptr<LogBackend> systemLogOfThisMachine() {
   return std::make_shared<JournalLog>(std::make_shared<SystemLog>());
 }
 
-ScenarioSummary summaryOfScenario(const std::filesystem::path& file) {
-  ScenarioFile read = quazor::read(readScenarioFile, file);
+ScenarioSummary summaryOfScenario(const std::filesystem::path& file, const ScenarioSource& find) {
+  const auto readIt = [&find](const std::filesystem::path& one) { return readScenarioFile(one, find); };
+  ScenarioFile read = quazor::read(readIt, file);
   return {read.scenario.title, std::move(read.expected), !read.scenario.faults.empty()};
 }
 

@@ -42,10 +42,14 @@ class Phone {
 // Creates a new phone on every call, all in the same initial state.
 using PhoneMaker = std::function<std::unique_ptr<Phone>()>;
 
+// Finds the file of a scenario that another one is based on by its name; empty if there is none.
+using ScenarioSource = std::function<std::filesystem::path(const std::filesystem::path& name)>;
+
 // Reads a scenario file and returns a factory for its phones, in virtual time or, if `realTime`, in real time. In
 // virtual time the seed determines the course of events. Throws a CommandError (kCannotRead) with the reader's sentence
 // if the file cannot be read.
-PhoneMaker phonesOfScenario(const std::filesystem::path& file, bool realTime, std::uint64_t seed);
+PhoneMaker phonesOfScenario(const std::filesystem::path& file, bool realTime, std::uint64_t seed,
+                            const ScenarioSource& find = nullptr);
 
 struct ScenarioSummary {
   std::string title;
@@ -78,6 +82,6 @@ bool isCleanupProcess(std::string_view processName);
 std::shared_ptr<LogBackend> systemLogOfThisMachine();
 
 // The summary of a scenario file. Throws a CommandError (kCannotRead) when the file cannot be read.
-ScenarioSummary summaryOfScenario(const std::filesystem::path& file);
+ScenarioSummary summaryOfScenario(const std::filesystem::path& file, const ScenarioSource& find = nullptr);
 
 }  // namespace quazor

@@ -10,6 +10,7 @@
 
 #include <cstdint>
 #include <filesystem>
+#include <functional>
 #include <memory>
 #include <optional>
 #include <set>
@@ -76,9 +77,13 @@ struct Scenario {
   std::shared_ptr<const JsonDocument> document;
 };
 
-// Reads a scenario file and the files that it is based on. Throws InputError: one sentence without a line end that
+// Finds the scenario of a name, which is not a file's; empty if there is none.
+using ScenarioFinder = std::function<std::filesystem::path(const std::filesystem::path& name)>;
+
+// Reads a scenario file and the scenarios that it is based on: files relative to the one that names them, or else those
+// that `find` knows by this name. Throws InputError: one sentence without a line end that
 // contains the file, the line if it is in this file, the JSON path of the invalid value, the problem and the
 // expectation. Thread: any.
-Scenario readScenario(const std::filesystem::path& file);
+Scenario readScenario(const std::filesystem::path& file, const ScenarioFinder& find = nullptr);
 
 }  // namespace quazor

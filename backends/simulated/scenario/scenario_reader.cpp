@@ -20,6 +20,8 @@ namespace fs = std::filesystem;
 // Thread: one at a time
 class Loader {
  public:
+  explicit Loader(const ScenarioFinder& find) : find_(find) {}
+
   Scenario load(const fs::path& file) {
     auto document = std::make_shared<JsonDocument>(JsonDocument::read(file));
     if (document->value().is_object() && document->value().contains("base"))
@@ -33,7 +35,7 @@ class Loader {
   // RFC 7396: the document as a merge patch on its base.
   Json merged(const JsonDocument& document, const fs::path& file) {
     const JsonCursor base = JsonCursor(document).at("base");
-    const fs::path baseFile = (file.parent_path() / base.text()).lexically_normal();
+    const fs::path baseFile = fileOfBase(base.text(), file);
     open_.push_back(canonical(file));
     if (std::ranges::find(open_, canonical(baseFile)) != open_.end()) {
       base.fail(inQuotes(base.text()) +
@@ -44,6 +46,14 @@ class Loader {
     Json result = loadBase(baseFile, base);
     result.merge_patch(patch);
     return result;
+  }
+
+  fs::path fileOfBase(const std::string& name, const fs::path& file) const {
+    fs::path beside = (file.parent_path() / name).lexically_normal();
+    std::error_code ignored;
+    const bool mayBeName = find_ && fs::path(name).is_relative() && !fs::is_regular_file(beside, ignored);
+    const fs::path found = mayBeName ? find_(name) : fs::path();
+    return found.empty() ? beside : found;
   }
 
   Json loadBase(const fs::path& file, const JsonCursor& base) {
@@ -61,11 +71,12 @@ class Loader {
     return path;
   }
 
+  const ScenarioFinder& find_;
   std::vector<fs::path> open_;
 };
 
 }  // namespace
 
-Scenario readScenario(const fs::path& file) { return Loader().load(file); }
+Scenario readScenario(const fs::path& file, const ScenarioFinder& find) { return Loader(find).load(file); }
 
 }  // namespace quazor
