@@ -17,6 +17,7 @@ struct Example {
 
 constexpr Example kExamples[] = {
     {"quazor list", "list the installed diagnostics and experiments"},
+    {"quazor run --all --except 'Tessel*'", "run every diagnostic except these"},
     {"quazor describe 'CameraSync*'", "what these diagnostics do, and their parameters"},
     {"quazor run --all", "run every diagnostic on the healthy simulated phone"},
     {"quazor run CameraSyncDiagnostic.Back --set duration=10"},
@@ -54,7 +55,7 @@ constexpr ExitCodeHelp kExitCodes[] = {
     {66, "a plug-in, scenario, binding, profile or record cannot be read or loaded",
      "list describe run experiment verify analyze diff explain doctor selftest"},
     {70, "quazor itself failed", {}},
-    {73, "a report or record cannot be written", {}},
+    {73, "a report or record cannot be written, or the record exists already", {}},
     {130, "interrupted", "list describe run experiment analyze doctor selftest"},
 };
 
