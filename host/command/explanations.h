@@ -4,6 +4,7 @@
 
 #include <cstdint>
 #include <filesystem>
+#include <functional>
 #include <string>
 #include <string_view>
 #include <vector>
@@ -53,5 +54,9 @@ std::vector<Explanation> readExplanations(const std::filesystem::path& directory
 // name, if it selects none.
 std::vector<const Explanation*> findExplanations(const std::vector<Explanation>& explanations,
                                                  const std::string& asked);
+
+// A function that tells whether an error, as DOMAIN:CODE, or a name has an explanation in the directory. The directory
+// is read at the first call; if it cannot be read, nothing has an explanation. Thread: one at a time.
+std::function<bool(const std::string& topic)> explainedTopics(std::filesystem::path directory);
 
 }  // namespace quazor
