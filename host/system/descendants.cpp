@@ -38,9 +38,20 @@ std::string nameOfProcess(pid_t process) {
 
 }  // namespace
 
-std::vector<pid_t> childrenOfThisProcess() {
+std::optional<std::vector<pid_t>> childrenOfThreads() {
   std::vector<pid_t> children;
-  if (!hasChild()) return children;
+  std::error_code error;
+  for (const auto& thread : std::filesystem::directory_iterator("/proc/self/task", error)) {
+    std::ifstream file(thread.path() / "children");  // proc(5)
+    if (!file) return std::nullopt;
+    for (pid_t one = 0; file >> one;) children.push_back(one);
+  }
+  if (error) return std::nullopt;
+  return children;
+}
+
+std::vector<pid_t> childrenByParent() {
+  std::vector<pid_t> children;
   const pid_t self = ::getpid();
   std::error_code error;
   for (const auto& entry : std::filesystem::directory_iterator("/proc", error)) {
@@ -55,6 +66,13 @@ std::vector<pid_t> childrenOfThisProcess() {
     if (parent == self) children.push_back(static_cast<pid_t>(std::stol(name)));
   }
   return children;
+}
+
+std::vector<pid_t> childrenOfThisProcess() {
+  if (!hasChild()) return {};
+  // The lists may miss the child of a thread that ends meanwhile. An empty one does, as there is a child.
+  const std::optional<std::vector<pid_t>> children = childrenOfThreads();
+  return children && !children->empty() ? *children : childrenByParent();
 }
 
 bool endChildren(const std::vector<pid_t>& others, IsCleanupProcess isCleanupProcess) {

@@ -4,7 +4,7 @@
 usage: tests/fuzz/long [--seconds SECONDS] [--slice SECONDS] [--state FOLDER] BUILD_DIRECTORY [FUZZER...]
 
 One fuzzer runs at a time, at low priority, the one with the fewest seconds first, until each has run for SECONDS (default
-3600). It can be interrupted at any time: the next call goes on with the corpus and the sums in FOLDER (default
+3600). Seconds are those of processor time, because a busy machine gives a fuzzer little of each second on the clock. It can be interrupted at any time: the next call goes on with the corpus and the sums in FOLDER (default
 $XDG_STATE_HOME/quazor/fuzz). An input that fails stays in FOLDER/FUZZER/failing; the next call tries it again first and,
 if it passes by then, moves it to the corpus. Prints a table at the end.
 
@@ -18,11 +18,11 @@ import json
 import os
 import pathlib
 import re
+import resource
 import shutil
 import signal
 import subprocess
 import sys
-import time
 
 ROOT = pathlib.Path(__file__).resolve().parents[2]
 HEARTBEAT = 5.0  # seconds between two saves of the sums
@@ -106,19 +106,27 @@ def add_statistics(sums, log):
     sums["coverage"] = max(sums["coverage"], *map(int, reached)) if reached else sums["coverage"]
 
 
+def processor_seconds(pid):
+    """What a running process has used: utime and stime of proc(5)'s stat, which follow the name in parentheses."""
+    fields = pathlib.Path(f"/proc/{pid}/stat").read_text(encoding="utf-8").rpartition(")")[2].split()
+    return (int(fields[11]) + int(fields[12])) / os.sysconf("SC_CLK_TCK")
+
+
+def processor_seconds_of_ended_processes():
+    used = resource.getrusage(resource.RUSAGE_CHILDREN)
+    return used.ru_utime + used.ru_stime
+
+
 def run_slice(programs, state, seeds, fuzzer, seconds):
     """Runs a fuzzer and adds to its sums, even if interrupted. Returns its exit code."""
     sums = state.of(fuzzer)
     logfile = state.folder / fuzzer / "log"
     arguments = [f"-max_total_time={seconds}", "-print_final_stats=1", *LIMITS,
                  f"-artifact_prefix={state.part(fuzzer, 'failing')}/", state.part(fuzzer, "corpus"), seeds / fuzzer]
-    last = time.monotonic()
+    before, ended_before = sums["seconds"], processor_seconds_of_ended_processes()
 
-    def add_time():
-        nonlocal last
-        now = time.monotonic()
-        sums["seconds"] += now - last
-        last = now
+    def save_seconds(spent):
+        sums["seconds"] = before + spent
         state.save()
 
     with open(logfile, "wb") as log:
@@ -127,13 +135,13 @@ def run_slice(programs, state, seeds, fuzzer, seconds):
             while True:
                 with contextlib.suppress(subprocess.TimeoutExpired):
                     return process.wait(timeout=HEARTBEAT)
-                add_time()
+                save_seconds(processor_seconds(process.pid))
         finally:
             if process.poll() is None:
                 process.terminate()  # the fuzzer still prints its statistics
                 process.wait()
             add_statistics(sums, logfile.read_text(encoding="utf-8", errors="replace"))
-            add_time()
+            save_seconds(processor_seconds_of_ended_processes() - ended_before)
 
 
 def table(state, fuzzers):
@@ -177,8 +185,8 @@ def fuzz(programs, state, fuzzers, seeds, goal, longest):
 def parse(arguments):
     home = os.environ.get("XDG_STATE_HOME") or pathlib.Path.home() / ".local" / "state"
     parser = argparse.ArgumentParser(description="Runs the fuzzers for a long time, in several periods.")
-    parser.add_argument("--seconds", type=float, default=3600, help="how long each fuzzer runs in all; default 3600")
-    parser.add_argument("--slice", type=float, default=300, help="how long one fuzzer runs before the next; default 300")
+    parser.add_argument("--seconds", type=float, default=3600, help="processor time of each fuzzer in all; default 3600")
+    parser.add_argument("--slice", type=float, default=300, help="how long one fuzzer runs before the next, on the clock; default 300")
     parser.add_argument("--state", type=pathlib.Path, default=pathlib.Path(home) / "quazor" / "fuzz",
                         help="the folder of the corpus and the sums")
     parser.add_argument("build", type=pathlib.Path, help="a build of the preset fuzzers or sanitized")

@@ -29,6 +29,9 @@ echo "#1 NEW    cov: 7 ft: 1 corp: 1/1b"
 """
 
 
+WORK = "for ((i = 0; i < 20000; i++)); do :; done\n"  # uses processor time
+
+
 class LongRunsTest(unittest.TestCase):
     def setUp(self):
         scratch = tempfile.TemporaryDirectory()
@@ -39,7 +42,7 @@ class LongRunsTest(unittest.TestCase):
         (self.build / "fuzz").mkdir(parents=True)
         self.write("fuzz_seeds", SEEDS)
         for name in ("quick", "slow"):
-            self.write(f"{name}_fuzzer", FUZZER + 'sleep 0.3 & wait $!\nfinish\n')
+            self.write(f"{name}_fuzzer", FUZZER + WORK + "finish\n")
 
     def write(self, name, text):
         program = self.build / "fuzz" / name
@@ -50,17 +53,17 @@ class LongRunsTest(unittest.TestCase):
         return [sys.executable, "-B", str(PROGRAM), "--state", str(self.state), *arguments, str(self.build)]
 
     def run_long(self, *arguments, fuzzers=()):
-        return subprocess.run([*self.command(*arguments), *fuzzers], capture_output=True, text=True, timeout=60,
+        return subprocess.run([*self.command(*arguments), *fuzzers], capture_output=True, text=True, timeout=300,
                               check=False)
 
     def sums(self):
         return json.loads((self.state / "state.json").read_text(encoding="utf-8"))
 
     def test_runs_every_fuzzer_until_its_time_is_over(self):
-        done = self.run_long("--seconds", "0.5", "--slice", "0.2")
+        done = self.run_long("--seconds", "0.1", "--slice", "0.2")
         self.assertEqual(done.returncode, 0, done.stderr)
         for name in ("quick", "slow"):
-            self.assertGreaterEqual(self.sums()[name]["seconds"], 0.5)
+            self.assertGreaterEqual(self.sums()[name]["seconds"], 0.1)
             self.assertGreaterEqual(self.sums()[name]["executions"], 100)
             self.assertEqual(self.sums()[name]["coverage"], 21)
         rows = [line.split() for line in done.stdout.splitlines()]
@@ -68,12 +71,24 @@ class LongRunsTest(unittest.TestCase):
         self.assertEqual([(row[0], row[3], row[4]) for row in rows[1:]], [("quick", "1", "21"), ("slow", "1", "21")])  # one input each
 
     def test_a_later_call_adds_to_the_sums_and_runs_no_longer_than_needed(self):
-        self.assertEqual(self.run_long("--seconds", "0.2").returncode, 0)
+        self.assertEqual(self.run_long("--seconds", "0.05").returncode, 0)
         first = self.sums()["quick"]
-        self.assertEqual(self.run_long("--seconds", "0.2").returncode, 0)
+        self.assertEqual(self.run_long("--seconds", "0.05").returncode, 0)
         self.assertEqual(self.sums()["quick"], first)
-        self.assertEqual(self.run_long("--seconds", str(first["seconds"] + 0.3)).returncode, 0)
+        self.assertEqual(self.run_long("--seconds", str(first["seconds"] + 0.03)).returncode, 0)
         self.assertGreater(self.sums()["quick"]["executions"], first["executions"])
+
+    def test_counts_processor_time_and_no_time_of_waiting(self):
+        self.write("quick_fuzzer", FUZZER + "sleep 0.5\nfinish\n")
+        process = subprocess.Popen([*self.command("--seconds", "0.4"), "quick"], stdout=subprocess.PIPE)
+        self.addCleanup(process.stdout.close)
+        self.addCleanup(process.wait)
+        self.addCleanup(process.terminate)
+        while process.poll() is None and not ((self.state / "state.json").exists() and
+                                              self.sums()["quick"]["executions"] >= 300):
+            time.sleep(0.05)
+        self.assertGreaterEqual(self.sums()["quick"]["executions"], 300)
+        self.assertLess(self.sums()["quick"]["seconds"], 0.4)
 
     def test_an_interruption_keeps_what_was_done(self):
         self.write("slow_fuzzer", FUZZER + "sleep 30 & wait $!\nfinish\n")
@@ -88,23 +103,23 @@ class LongRunsTest(unittest.TestCase):
         self.assertGreater(self.sums()["slow"]["seconds"], 0)
 
     def test_an_input_that_fails_is_kept_and_named_until_it_passes(self):
-        self.write("quick_fuzzer", FUZZER + '[ -e MENDED ] && { sleep 0.2; finish; }\necho bad >"${failing}crash-1"\nexit 77\n')
-        done = self.run_long("--seconds", "0.2", fuzzers=["quick"])
+        self.write("quick_fuzzer", FUZZER + 'if [ -e MENDED ]; then\n' + WORK + 'finish\nfi\necho bad >"${failing}crash-1"\nexit 77\n')
+        done = self.run_long("--seconds", "0.05", fuzzers=["quick"])
         kept = self.state / "quick" / "failing" / "crash-1"
         self.assertEqual(done.returncode, 1)
         self.assertIn(f"the quick fuzzer fails with {kept}", done.stdout)
-        again = self.run_long("--seconds", "0.2", fuzzers=["quick"])
+        again = self.run_long("--seconds", "0.05", fuzzers=["quick"])
         self.assertEqual(again.returncode, 1)
         self.assertTrue(kept.exists())
         self.mended.touch()
-        mended = self.run_long("--seconds", "0.2", fuzzers=["quick"])
+        mended = self.run_long("--seconds", "0.05", fuzzers=["quick"])
         self.assertEqual(mended.returncode, 0, mended.stdout)
         self.assertFalse(kept.exists())
         self.assertTrue((self.state / "quick" / "corpus" / "crash-1").exists())
 
     def test_a_fuzzer_that_ends_in_another_way_fails_too(self):
         self.write("quick_fuzzer", "exit 5\n")
-        done = self.run_long("--seconds", "0.2", fuzzers=["quick"])
+        done = self.run_long("--seconds", "0.05", fuzzers=["quick"])
         self.assertEqual(done.returncode, 1)
         self.assertIn("exit code 5 and no input", done.stdout)
 
