@@ -51,7 +51,8 @@ def failure_line(record):
         names = list(dict.fromkeys(one.name for one in record["results"] if one.verdict == "fail"))
         what = ", ".join(names[:3]) + (f" and {len(names) - 3} more" if len(names) > 3 else "")
     word = {"fail": "FAIL ", "error": "ERROR"}[record["verdict"]]
-    return f"{word} {report_readers.printable(record['name'])}: {report_readers.printable(what)}"
+    name = report_readers.printable(record["name"])
+    return f"{word} {name}: {report_readers.printable(what)}" if what else f"{word} {name}"
 
 
 def text_end(records, of_experiments, interrupted):
