@@ -2,6 +2,7 @@
 #pragma once
 
 #include "contract/log_channel.h"
+#include "host/cli/choice_options.h"
 #include "host/error/exit_code.h"
 #include "host/limits/user_limit.h"
 #include "host/plugin/parameters.h"
@@ -55,6 +56,7 @@ struct Options {
   std::filesystem::path profile;               // empty: the installed one
   std::optional<Profile> recorded;             // the parameters of the run that is repeated
   std::filesystem::path phone;                 // a scenario, or linux:BINDING; empty: the installed healthy one
+  Choice choice;                               // of what runs, and how often
   ReportOptions report;
   std::vector<DeadlineSetting> deadlines;
   std::chrono::nanoseconds grace = kDefaultGrace;

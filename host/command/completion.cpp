@@ -72,6 +72,7 @@ class Completer {
       for (const Stage stage : kStages) stages.push_back(std::string(nameOf(stage)) + "=");
       return stages;
     }
+    if (option == "--except") return operands();
     return option == "--set" ? parameters() : std::vector<std::string>();
   }
 
@@ -87,7 +88,10 @@ class Completer {
     if (command == "completion") return {"bash", "zsh"};
     if (command == "phone") return {"probe"};
     std::vector<std::string> names;
-    if (command != "run" && command != "describe" && command != "experiment" && command != "explain") return names;
+    if (command != "run" && command != "describe" && command != "experiment" && command != "explain" &&
+        command != "list") {
+      return names;
+    }
     for (const DescribedDiagnostic& one : catalogue(false)) {
       const bool experimentOnly = one.diagnostic.experimentOnly;
       if ((command == "run" && experimentOnly) || (command == "experiment" && !experimentOnly)) continue;

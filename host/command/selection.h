@@ -25,6 +25,10 @@ IsolationOptions isolationOf(const Options& options, const Installation& install
 std::vector<std::filesystem::path> recordedPlugins(const std::vector<std::string>& recorded,
                                                    const Installation& installation);
 
+// The diagnostics or experiments that the options select, in the order of their names. Throws a CommandError (kUsage)
+// for a name or a pattern that fits nothing, unless `mayBeNone`.
+std::vector<Diagnostic> wantedOf(const std::vector<Diagnostic>& catalogue, const Options& options, bool mayBeNone);
+
 // Scans the plug-ins in separate processes, or in this one with --in-process. `described` chooses the diagnostics that
 // are asked for their descriptions. Throws a CommandError if a plug-in cannot be loaded or others may change it, and
 // kInterrupted on an interrupt. `signals` is the command's; null: they are watched during the scan only.
