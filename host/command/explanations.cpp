@@ -264,12 +264,12 @@ std::vector<const Explanation*> findExplanations(const std::vector<Explanation>&
   return found;
 }
 
-std::function<bool(const std::string& topic)> explainedTopics(std::filesystem::path directory) {
+std::function<bool(const std::string& topic)> explainedTopics(std::vector<std::filesystem::path> directories) {
   return [directory = std::move(directory),
           all = std::optional<std::vector<Explanation>>()](const std::string& topic) mutable {
     if (!all) {
       try {
-        all = readExplanations(directory);
+        all = readExplanations(directories);
       } catch (const InputError&) {
         all.emplace();
       }

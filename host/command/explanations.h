@@ -56,8 +56,8 @@ std::vector<Explanation> readExplanations(const std::vector<std::filesystem::pat
 std::vector<const Explanation*> findExplanations(const std::vector<Explanation>& explanations,
                                                  const std::string& asked);
 
-// A function that tells whether an error, as DOMAIN:CODE, or a name has an explanation in the directory. The directory
-// is read at the first call; if it cannot be read, nothing has an explanation. Thread: one at a time.
-std::function<bool(const std::string& topic)> explainedTopics(std::filesystem::path directory);
+// A function that tells whether an error, as DOMAIN:CODE, or a name has an explanation in the directories. They
+// are read at the first call; if they cannot be read, nothing has an explanation. Thread: one at a time.
+std::function<bool(const std::string& topic)> explainedTopics(std::vector<std::filesystem::path> directories);
 
 }  // namespace quazor
