@@ -265,7 +265,7 @@ std::vector<const Explanation*> findExplanations(const std::vector<Explanation>&
 }
 
 std::function<bool(const std::string& topic)> explainedTopics(std::vector<std::filesystem::path> directories) {
-  return [directory = std::move(directory),
+  return [directories = std::move(directories),
           all = std::optional<std::vector<Explanation>>()](const std::string& topic) mutable {
     if (!all) {
       try {
