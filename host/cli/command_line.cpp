@@ -409,6 +409,11 @@ void declareOtherCommands(CLI::App& app, RawOptions& raw) {
       ->type_name("")
       ->required()
       ->check(CLI::IsMember({"bash", "zsh"}));
+  CLI::App& project = *app.add_subcommand("new", "Make the project of a plug-in, with a diagnostic, phones and a test");
+  project.add_option("FOLDER", raw.names, "Where to make it; its last part is the plug-in's name")
+      ->type_name("")
+      ->required()
+      ->expected(1);
 }
 
 void declareCommands(CLI::App& app, RawOptions& raw) {
