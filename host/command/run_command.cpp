@@ -1,6 +1,7 @@
 #include "host/command/commands.h"
 
 #include "contract/contract.h"
+#include "host/command/explanations.h"
 #include "host/command/failed_only.h"
 #include "host/command/output_check.h"
 #include "host/command/selection.h"
@@ -133,6 +134,7 @@ std::unique_ptr<EventPipeline> beginEvents(Options options, const Installation& 
   outputs.keepsLastRun = keepsLastRun;
   outputs.systemLog = options.systemLog;
   outputs.report = options.report;
+  outputs.report.text.isExplained = explainedTopics(installation.explanations());
   outputs.logLimit = options.logLimit;
   return std::make_unique<EventPipeline>(outputs, console);
 }
