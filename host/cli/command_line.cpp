@@ -44,9 +44,11 @@ struct RawOptions {
   std::string format = "text";
   ChoiceTexts choice;
   bool all = false;
+  bool replace = false;
   bool realTime = false;
   bool systemLog = false;
   bool inProcess = false;
+  bool verbose = false;
 };
 
 void addRepeatable(CLI::App& command, const std::string& name, std::vector<std::string>& texts,
@@ -156,6 +158,11 @@ void addTags(CLI::App& command, RawOptions& raw) {
       "KEY=VALUE");
 }
 
+void addVerbose(CLI::App& command, RawOptions& raw) {
+  command.add_flag("--verbose", raw.verbose,
+                   "Show every result in text reports, not only those that fail, warn or have a limit of your own");
+}
+
 void addLimits(CLI::App& command, RawOptions& raw) {
   addRepeatable(command, "--limit", raw.limits,
                 "Also judge results by this limit, such as 'BackTele.Total >= 90', '*.FrameOffset in [-2, 2]' or "
@@ -180,8 +187,12 @@ void addLogOptions(CLI::App& command, RawOptions& raw) {
 }
 
 void addRecord(CLI::App& command, RawOptions& raw) {
-  command.add_option("--record", raw.record, "Record every event of the run in this file as it happens")
-      ->type_name("FILE");
+  command
+      .add_option(
+          "--record", raw.record,
+          "Record every event of the run in this new file as it happens, or in one of its own in the folder DIR")
+      ->type_name("FILE|DIR/");
+  command.add_flag("--replace", raw.replace, "Replace the file of --record if it exists");
 }
 
 void addRunOptions(CLI::App& command, RawOptions& raw, const std::string& what) {
@@ -278,6 +289,8 @@ Options optionsOf(const CLI::App& command, const RawOptions& raw) {
   options.parameterFiles.assign(raw.parameterFiles.begin(), raw.parameterFiles.end());
   options.records.assign(raw.records.begin(), raw.records.end());
   options.record = raw.record;
+  options.replace = raw.replace;
+  if (raw.replace && raw.record.empty()) throw CommandError(ExitCode::kUsage, "--replace requires --record");
   options.onlyFailed = raw.only == "failed";
   options.failedOf = raw.of;
   options.phone = raw.phone;
@@ -299,6 +312,7 @@ Options optionsOf(const CLI::App& command, const RawOptions& raw) {
   const bool isOfRun = options.command == Command::kRun || options.command == Command::kExperiment ||
                        options.command == Command::kAnalyze;
   options.report = reportOf(raw, isOfRun);
+  options.report.text.verbose = raw.verbose;
   options.report.shownLog = options.logLevel.value_or(LogLevel::kError);
   options.withoutProfile = raw.profile == "none";
   if (!options.withoutProfile) options.profile = raw.profile;
@@ -363,8 +377,10 @@ void declareRunningCommands(CLI::App& app, RawOptions& raw) {
     addProcessOptions(*command, raw);
     addTags(*command, raw);
   }
-  addLimits(run, raw);
-  addLimits(analyze, raw);
+  for (CLI::App* const command : {&run, &analyze}) {
+    addLimits(*command, raw);
+    addVerbose(*command, raw);
+  }
 }
 
 void declareOtherCommands(CLI::App& app, RawOptions& raw) {
