@@ -8,6 +8,7 @@ import resource
 import shutil
 import signal
 import subprocess
+import tempfile
 import time
 
 LISTED_TEST = re.compile(r"^ +Test +#\d+: (\S+)", re.MULTILINE)
@@ -42,7 +43,11 @@ class Laboratory:
         self.root = root
         self.source = work / "source"
         self.build = self.source / "build" / "test"  # so that a compiler cache knows the paths
-        self.scratch = work / "scratch"
+        # Tests become other users, who cannot enter a work folder below somebody's home.
+        self.enclosing = tempfile.TemporaryDirectory(prefix="quazor-mutation-")
+        os.chmod(self.enclosing.name, 0o711)
+        self.scratch = pathlib.Path(self.enclosing.name) / "scratch"
+        self.output = work / "output"
         self.jobs = jobs
         self.confine = confine
 
@@ -107,8 +112,7 @@ class Laboratory:
             environment["CCACHE_DIR"] = str(pathlib.Path.home() / ".cache" / "ccache")
         if not self.scratch.is_dir():
             self.scratch.mkdir(parents=True)
-        output = self.scratch.with_name("output")
-        with open(output, "wb") as log:
+        with open(self.output, "wb") as log:
             process = subprocess.Popen(command, stdout=log, stderr=subprocess.STDOUT, stdin=subprocess.DEVNULL,
                                        env=environment, start_new_session=True, preexec_fn=limit_resources)
             try:
@@ -119,7 +123,7 @@ class Laboratory:
                 if process.poll() is None:
                     os.killpg(process.pid, signal.SIGKILL)
                     process.wait()
-        return code == 0, output.read_text(encoding="utf-8", errors="replace")
+        return code == 0, self.output.read_text(encoding="utf-8", errors="replace")
 
 
 def seconds_since(begin):

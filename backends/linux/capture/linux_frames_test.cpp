@@ -2,6 +2,7 @@
 #include "backends/linux/capture/camera_frames.h"
 #include "backends/linux/capture/linux_capture_for_tests.h"
 #include "backends/linux/video/v4l2_device.h"
+#include "backends/log/recording_log.h"
 
 #include <cerrno>
 #include <thread>
@@ -89,6 +90,38 @@ TEST(LinuxFramesOwnMachineTest, AMetadataNodeThatFailsLeavesTheCameraStreaming) 
     EXPECT_EQ(fake.counter(kInfrared, "MetadataErrorCount"), atQueue ? 0 : 10);
     EXPECT_EQ(fake.stop(kInfrared), "done");
   }
+}
+
+TEST_F(LinuxFramesTest, AMetadataNodeThatFailsIsToldInTheLog) {
+  const auto log = std::make_shared<RecordingLog>();
+  sharedLog().setBackend(log, LogLevel::kError);
+  fake.begin(kInfrared, seen.handler());
+  fake.kernel->breakStream(fake.metadataNode);
+  fake.kernel->passTime(100ms);
+  seen.wait(3);
+  EXPECT_EQ(fake.stop(kInfrared), "done");
+  sharedLog().setBackend(nullptr, LogLevel::kError);
+  ASSERT_EQ(log->records().size(), 1U);
+  EXPECT_EQ(log->records()[0].text,
+            "FrontFacingInfraredCamera while streaming: LinuxErrorDomain code 1: VIDIOC_DQBUF on " + fake.metadataNode +
+                " failed: Input/output error (EIO)");
+}
+
+TEST_F(LinuxFramesTest, AMetadataNodeThatIsAlwaysReadyDoesNotKeepTheCameraWaiting) {
+  fake.kernel->with(fake.metadataNode, [](FakeNode& node) { return node.mostBuffers = 1; });
+  int dequeued = 0;  // read and written by the thread of the frames
+  int dequeuedBefore = 0;
+  fake.begin(kInfrared, [&](PixelBuffer&, MediaTime) { dequeuedBefore = dequeued; });
+  ASSERT_TRUE(fake.kernel->settle());
+  fake.kernel->beforeCall = [&](unsigned long request) {
+    if (request == VIDIOC_DQBUF && ++dequeued <= 3) fake.kernel->produce(fake.metadataNode);
+  };
+  fake.kernel->passTime(0ms);
+  fake.kernel->produce(fake.nodes[kInfrared]);
+  ASSERT_TRUE(fake.kernel->settle());
+  EXPECT_EQ(fake.stop(kInfrared), "done");
+  fake.kernel->beforeCall = nullptr;
+  EXPECT_EQ(dequeuedBefore, 3) << "one of the metadata, the frame, and the one that is not there yet";
 }
 
 TEST_F(LinuxFramesTest, ABufferThatIsKeptTakesNothingFromTheDriver) {
