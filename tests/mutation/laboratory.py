@@ -16,7 +16,7 @@ MEMORY = 16 << 30  # a mutant may allocate without end
 FILE_SIZE = 2 << 30
 # Checks of texts of the tree, and tests that take long for what they could detect here.
 NOT_JUDGES = ("include_directions.*|every_test_is_built.*|folders.*|thread_words.*|run_paths.*|check_test|"
-              "headers_stand_alone.*|compile_failure.*|kernel_.*|check_installed|projector_stress_test|mutation_.*|"
+              "headers_stand_alone.*|compile_failure_self_test|kernel_.*|check_installed|projector_stress_test|mutation_.*|"
               "fuzz_.*")
 
 
@@ -50,6 +50,12 @@ class Laboratory:
         self.output = work / "output"
         self.jobs = jobs
         self.confine = confine
+
+    def close(self):
+        self.enclosing.cleanup()
+
+    def enclosing_mode(self):
+        return os.stat(self.enclosing.name).st_mode
 
     def update(self):
         """Makes the copy equal to the tree's files, without touching those that are equal."""
