@@ -93,7 +93,10 @@ void removeMarks(RawOptions& raw) {
 }
 
 void addPlugins(CLI::App& command, RawOptions& raw) {
-  addRepeatable(command, "--plugin", raw.plugins, "Load this plug-in instead of the installed one; repeatable", "FILE");
+  addRepeatable(command, "--plugin", raw.plugins,
+                "Load this plug-in instead of those in the folders of plug-ins: a file, or the name of one in these "
+                "folders; repeatable. The environment variable QUAZOR_PLUGIN_PATH names more folders",
+                "FILE|NAME");
 }
 
 void addReportOptions(CLI::App& command, RawOptions& raw, const std::vector<std::string>& formats) {

@@ -45,7 +45,7 @@ inline constexpr std::string_view kCommandNames[] = {"list",   "describe", "run"
 // A parsed command line. Options that the command does not have keep their defaults.
 struct Options {
   std::vector<std::string> names;  // positional arguments: diagnostics or experiments, topics, a shell, "probe"
-  std::vector<std::filesystem::path> plugins;  // empty: the installed one
+  std::vector<std::filesystem::path> plugins;  // empty: those in the folders of plug-ins
   std::vector<ParameterOverride> settings;
   std::vector<UserLimit> limits;
   OrderedMap<std::string> tags;

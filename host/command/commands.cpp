@@ -130,13 +130,14 @@ ExitCode runArguments(const std::vector<std::string>& arguments, const Installat
     return ExitCode::kAllPassed;
   }
   ExitCode code = ExitCode::kInternal;
-  const std::optional<Options> options = parseCommandLine(arguments, console.out, console.err, &code);
+  std::optional<Options> options = parseCommandLine(arguments, console.out, console.err, &code);
   if (!options) return code;
   const auto refused = [&console](const InputError& error, ExitCode because) {
     console.err << "quazor: " << printable(error.what()) << '\n';
     return because;
   };
   try {
+    for (std::filesystem::path& plugin : options->plugins) plugin = installation.plugin(plugin);
     return perform(*options, installation, console);
   } catch (const CommandError& error) {
     return refused(error, error.code());

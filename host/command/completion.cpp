@@ -67,6 +67,7 @@ class Completer {
     if (option == "--only") return {"failed"};
     if (option == "--log-limit" || option == "--memory") return {"none"};
     if (option == "--phone") return phones();
+    if (option == "--plugin") return plugins();
     if (option == "--deadline") {
       std::vector<std::string> stages;
       for (const Stage stage : kStages) stages.push_back(std::string(nameOf(stage)) + "=");
@@ -74,6 +75,15 @@ class Completer {
     }
     if (option == "--except") return operands();
     return option == "--set" ? parameters() : std::vector<std::string>();
+  }
+
+  std::vector<std::string> plugins() const {
+    std::vector<std::string> names;
+    try {
+      for (const std::filesystem::path& file : installation_.allPlugins()) names.push_back(file.stem().string());
+    } catch (const InputError&) {  // a folder cannot be read; the command itself says so
+    }
+    return names;
   }
 
   std::vector<std::string> phones() const {
@@ -112,10 +122,10 @@ class Completer {
 
   std::vector<DescribedDiagnostic> catalogue(bool described) const {
     Options options;
-    for (std::size_t i = 1; i + 1 < words_.size(); ++i) {
-      if (words_[i] == "--plugin") options.plugins.emplace_back(words_[i + 1]);
-    }
     try {
+      for (std::size_t i = 1; i + 1 < words_.size(); ++i) {
+        if (words_[i] == "--plugin") options.plugins.push_back(installation_.plugin(words_[i + 1]));
+      }
       std::vector<DescribedDiagnostic> all =
           scanOf(options, installation_, [described](const std::vector<Diagnostic>& everything) {
             return described ? everything : std::vector<Diagnostic>();

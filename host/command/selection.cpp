@@ -120,16 +120,19 @@ std::vector<std::filesystem::path> recordedPlugins(const std::vector<std::string
 
 IsolationOptions isolationOf(const Options& options, const Installation& installation) {
   IsolationOptions isolation{options.plugins, options.memory, options.deadlines, options.grace};
-  if (isolation.plugins.empty()) isolation.plugins.push_back(installation.defaultPlugin());
+  if (!isolation.plugins.empty()) return isolation;
+  isolation.plugins = installation.defaultPlugins();
+  isolation.unasked = !isolation.plugins.empty();
+  if (!isolation.unasked) isolation.plugins.push_back(installation.shippedPlugin());  // to be told that it is missing
   return isolation;
 }
 
 PluginScan scanOf(const Options& options, const Installation& installation, const DiagnosticChoice& described,
                   WatchedSignals* signals) {
   const IsolationOptions isolation = isolationOf(options, installation);
-  requireTrustedPlugins(isolation.plugins);
   PluginScan scan;
   if (options.inProcess) {
+    requireTrustedPlugins(isolation.plugins);
     loadPlugins(isolation.plugins);
     const std::vector<Diagnostic> catalogue = catalogueOf(QZLab::defaultLab());
     const std::vector<Diagnostic> wanted = described(catalogue);
