@@ -228,6 +228,7 @@ TEST_F(RecordFileTest, ReadsLinesOfAnyLengthUpToTheLimit) {
 TEST_F(RecordFileTest, WritesNoEventThatCouldNotBeReadBack) {
   const RunEvent event = AuxiliaryDataAdded{"key", Value("value")};
   for (const bool tooLong : {false, true}) {
+    fs::remove(file_);
     RecordWriter writer(file_);
     writer.onEvent(runOf({}));
     writer.onEvent(event, std::string(kMaxLine + (tooLong ? 1 : 0), 'x') + "\n");
