@@ -43,7 +43,8 @@ void addResults(std::vector<std::string>& changes, const DiagnosticRecord& healt
     }
     const std::string now = valueText(one.result.measurement());
     const std::string then = valueText(before->result.measurement());
-    if (now != then) changes.push_back(name + " is " + now + " instead of " + then + ": " + whyItPasses(*before, one));
+    if (now == then) continue;
+    changes.push_back(formatMessage("%@ is %@ instead of %@: %@", name, now, then, whyItPasses(*before, one)));
   }
   for (const JudgedResult& one : healthy.measuredResults) {
     if (resultNamed(record, one.result.name()) == nullptr) {
