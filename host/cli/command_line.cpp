@@ -385,7 +385,7 @@ void declareRunningCommands(CLI::App& app, RawOptions& raw) {
 
 void declareOtherCommands(CLI::App& app, RawOptions& raw) {
   CLI::App& verify = *app.add_subcommand("verify", "Check that the verdicts in records follow from their data");
-  addRecords(verify, raw, 1, CLI::detail::expected_max_vector_size, "The records");
+  addRecords(verify, raw, 1, CLI::detail::expected_max_vector_size, "The records, or folders of them");
   CLI::App& diff = *app.add_subcommand("diff", "Show the differences between two records");
   addRecords(diff, raw, 2, 2, "The two records");
   CLI::App& explain = *app.add_subcommand("explain", "Explain an error, a diagnostic or a result, and what to do next");

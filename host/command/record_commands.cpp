@@ -1,67 +1,127 @@
 #include "host/command/commands.h"
 
-#include "contract/message_format.h"
 #include "host/record/record_file.h"
+#include "host/record/record_place.h"
 #include "host/record/verification.h"
 #include "host/report/record_difference.h"
 #include "host/text/table.h"
 
 #include <algorithm>
+#include <cstddef>
+#include <filesystem>
+#include <iterator>
 #include <sstream>
+#include <string>
+#include <string_view>
+#include <system_error>
+#include <vector>
 
 namespace quazor {
 
 namespace {
 
-// Appends what verify says about a record and returns its exit code.
-ExitCode verifyRecord(const std::filesystem::path& file, std::ostream& answer) {
+// What verify found in a record.
+struct Finding {
+  ExitCode code = ExitCode::kAllPassed;
+  std::string counts;   // of events and verdicts; empty if a line is wrong
+  std::string missing;  // what an incomplete record lacks
+  std::vector<std::string> problems;
+};
+
+std::string problemCount(const Finding& finding) { return countText(finding.problems.size(), "problem"); }
+
+Finding verifyRecord(const std::filesystem::path& file) {
+  Finding finding;
   StoredRecord stored;
   try {
     stored = readRecord(file);
   } catch (const RecordDefect& defect) {
-    answer << "WRONG  " << printable(defect.what()) << '\n';
-    return ExitCode::kFailed;
+    return {ExitCode::kFailed, {}, {}, {defect.what()}};
   }
-  std::vector<std::string> problems = problemsOf(stored.events);
-  const bool complete = std::holds_alternative<RunEnded>(stored.events.back());
-  if (complete && stored.cutOff) problems.emplace_back("an incomplete line follows the end of the run");
-  for (const std::string& problem : problems) answer << "WRONG  " << printable(problem) << '\n';
+  finding.problems = problemsOf(stored.events);
+  const bool isComplete = std::holds_alternative<RunEnded>(stored.events.back());
+  if (isComplete && stored.cutOff) finding.problems.emplace_back("an incomplete line follows the end of the run");
   const auto verdicts =
       static_cast<std::size_t>(std::count_if(stored.events.begin(), stored.events.end(), [](const RunEvent& event) {
         return std::holds_alternative<DiagnosticEnded>(event);
       }));
-  answer << countText(stored.events.size(), "event") << ", " << countText(verdicts, "verdict") << ", "
-         << countText(problems.size(), "problem") << '\n';
-  if (!complete) {
-    answer << "The record is incomplete: the run did not end"
-           << (stored.cutOff ? ", and the record's last line is cut off.\n" : ".\n");
+  finding.counts = countText(stored.events.size(), "event") + ", " + countText(verdicts, "verdict");
+  if (!isComplete) {
+    finding.missing =
+        stored.cutOff ? "the run did not end, and the record's last line is cut off" : "the run did not end";
+    finding.code = ExitCode::kIncomplete;
   }
-  if (!problems.empty()) return ExitCode::kFailed;
-  return complete ? ExitCode::kAllPassed : ExitCode::kIncomplete;
+  if (!finding.problems.empty()) finding.code = ExitCode::kFailed;
+  return finding;
+}
+
+ExitCode verifyOne(const std::filesystem::path& file, const Options& options, Console& console) {
+  const Finding finding = verifyRecord(file);
+  std::string answer;
+  for (const std::string& problem : finding.problems) answer += "WRONG  " + printable(problem) + "\n";
+  if (!finding.counts.empty()) answer += finding.counts + ", " + problemCount(finding) + "\n";
+  if (!finding.missing.empty()) answer += "The record is incomplete: " + finding.missing + ".\n";
+  writeOutput(options.report, console, answer);
+  return finding.code;
+}
+
+// How a record can be, best first. Text and count are those of the answer.
+struct Outcome {
+  ExitCode code;
+  std::string_view word;
+  std::string_view name;
+  std::size_t records = 0;
+};
+
+std::string lineOf(const std::filesystem::path& file, const Finding& finding, std::string_view word) {
+  std::string line(word);
+  line.append(12 - word.size(), ' ');
+  line += printable(file.string()) + ": ";
+  if (finding.code == ExitCode::kCannotRead) return line + printable(finding.problems.front()) + "\n";
+  line += finding.counts;
+  if (!finding.problems.empty()) line += (finding.counts.empty() ? "" : ", ") + problemCount(finding);
+  if (!finding.missing.empty()) line += "; " + finding.missing;
+  line += "\n";
+  for (const std::string& problem : finding.problems) line += "    " + printable(problem) + "\n";
+  return line;
+}
+
+ExitCode verifyMany(const std::vector<std::filesystem::path>& files, Console& console) {
+  Outcome outcomes[] = {{ExitCode::kAllPassed, "OK", "OK"},
+                        {ExitCode::kIncomplete, "INCOMPLETE", "incomplete"},
+                        {ExitCode::kFailed, "WRONG", "wrong"},
+                        {ExitCode::kCannotRead, "UNREADABLE", "unreadable"}};
+  for (const std::filesystem::path& file : files) {
+    Finding finding;
+    try {
+      finding = verifyRecord(file);
+    } catch (const CommandError& refusal) {
+      finding = {refusal.code(), {}, {}, {refusal.what()}};
+    }
+    Outcome& outcome = *std::find_if(std::begin(outcomes), std::end(outcomes),
+                                     [&finding](const Outcome& one) { return one.code == finding.code; });
+    ++outcome.records;
+    console.out << lineOf(file, finding, outcome.word) << std::flush;
+  }
+  std::string total;
+  ExitCode worst = ExitCode::kAllPassed;
+  for (const Outcome& one : outcomes) {
+    if (one.records == 0) continue;
+    total += (total.empty() ? ": " : ", ") + std::to_string(one.records) + " " + std::string(one.name);
+    worst = one.code;
+  }
+  console.out << countText(files.size(), "record") << total << '\n' << std::flush;
+  if (!console.out) throw CommandError(ExitCode::kCannotWrite, "standard output cannot be written");
+  return worst;
 }
 
 }  // namespace
 
 ExitCode verifyCommand(const Options& options, Console& console) {
-  constexpr ExitCode kWorstFirst[] = {ExitCode::kCannotRead, ExitCode::kFailed, ExitCode::kIncomplete};
-  const bool isOne = options.records.size() == 1;
-  std::ostringstream answer;
-  std::vector<ExitCode> codes;
-  for (const std::filesystem::path& file : options.records) {
-    if (!isOne) answer << printable(file.string()) << ":\n";
-    try {
-      codes.push_back(verifyRecord(file, answer));
-    } catch (const CommandError& refusal) {
-      if (isOne) throw;
-      answer << "WRONG  " << printable(refusal.what()) << '\n';
-      codes.push_back(refusal.code());
-    }
-  }
-  writeOutput(options.report, console, answer.str());
-  for (const ExitCode code : kWorstFirst) {
-    if (std::find(codes.begin(), codes.end(), code) != codes.end()) return code;
-  }
-  return ExitCode::kAllPassed;
+  const std::vector<std::filesystem::path>& given = options.records;
+  std::error_code ignored;
+  const bool isOne = given.size() == 1 && !std::filesystem::is_directory(given.front(), ignored);
+  return isOne ? verifyOne(given.front(), options, console) : verifyMany(recordsIn(given), console);
 }
 
 ExitCode diffCommand(const Options& options, Console& console) {

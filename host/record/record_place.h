@@ -1,10 +1,11 @@
-// Where the record of a run is made.
+// Where the record of a run is made, and which records a folder has.
 #pragma once
 
 #include "host/model/run_event.h"
 
 #include <filesystem>
 #include <string>
+#include <vector>
 
 namespace quazor {
 
@@ -17,5 +18,10 @@ std::string recordNameOf(const RunStarted& began);
 
 // Makes the folder, with those above it, unless it exists. Throws a CommandError (kCannotWrite) if that fails.
 void makeFolderOfRecords(const std::filesystem::path& folder);
+
+// The records to read, each once: the files given, and of each folder its files in the order of their names, with those
+// in the folders in it: what ends in .jsonl and is no pipe or device. Throws a CommandError (kCannotRead) for a folder
+// that has none or cannot be read.
+std::vector<std::filesystem::path> recordsIn(const std::vector<std::filesystem::path>& given);
 
 }  // namespace quazor

@@ -39,5 +39,23 @@ TEST(RecordPlaceTest, MakesAFolder) {
   EXPECT_THAT(refusal, testing::StartsWith("the folder '" + (file / "x").string() + "' of records cannot be made: "));
 }
 
+TEST(RecordPlaceTest, FindsEveryRecordOnceInTheOrderOfNames) {
+  const TestDirectory directory;
+  const std::filesystem::path& folder = directory.path();
+  std::filesystem::create_directories(folder / "b.jsonl");
+  std::filesystem::create_directories(folder / "empty");
+  for (const char* name : {"z.jsonl", "b.jsonl/2.jsonl", "b.jsonl/1.jsonl", "a.txt", "c.jsonl.tmp"})
+    directory.write(name, "");
+  std::filesystem::create_symlink("nowhere", folder / "gone.jsonl");
+  std::filesystem::create_symlink(folder, folder / "empty" / "loop.jsonl");
+  const auto one = folder / "b.jsonl" / "1.jsonl";
+  const auto two = folder / "b.jsonl" / "2.jsonl";
+  EXPECT_THAT(recordsIn({folder}), testing::ElementsAre(one, two, folder / "gone.jsonl", folder / "z.jsonl"));
+  EXPECT_THAT(recordsIn({two, folder / "b.jsonl", "none", two}), testing::ElementsAre(two, one, "none"));
+  const std::string refusal = refusalOf(ExitCode::kCannotRead, [&] { recordsIn({folder, folder / "empty"}); });
+  EXPECT_EQ(refusal,
+            "the folder '" + (folder / "empty").string() + "' contains no record: no file in it ends in .jsonl");
+}
+
 }  // namespace
 }  // namespace quazor

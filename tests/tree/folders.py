@@ -29,7 +29,7 @@ LINES = ("What happens here", "What comes in", "What goes out", "What it may inc
 
 # Folders without C++ sources that need a README.
 DESCRIBED = ["backends", "base", "benchmarks", "cmake", "data", "data/bindings", "data/explanations", "data/profiles",
-             "data/scenarios", "diagnostics", "docs", "examples", "host", "packaging", "tests", "tests/mutation",
+             "data/scenarios", "data/schemas", "diagnostics", "docs", "examples", "host", "packaging", "tests", "tests/mutation",
              "tests/tree"]
 # Folders whose sources are listed in a CMakeLists.txt above them.
 BUILT_ABOVE = ["tests/compile_failures", "tests/misbehaving"]
