@@ -143,7 +143,7 @@ class Selftest {
   // Adds the rows of the phone and its detection. Returns false if it was interrupted; then it adds nothing.
   bool performPhone(const std::string& name, SelftestOutcome& outcome) {
     const std::filesystem::path file = installation_.scenario(name);
-    const ScenarioSummary summary = summaryOfScenario(file);
+    const ScenarioSummary summary = summaryOfScenario(file, installation_.scenarioSource());
     if (summary.expected.empty()) return true;
     PhoneDetection phone{name, summary.title, file == installation_.defaultScenario(), false, {}, {}, {}};
     std::vector<SelftestRow> rows;
