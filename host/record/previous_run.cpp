@@ -2,6 +2,7 @@
 
 #include <algorithm>
 #include <cstdlib>
+#include <system_error>
 
 namespace quazor {
 
@@ -23,6 +24,11 @@ std::filesystem::path previousRunFile() {
     state /= ".local/state";
   }
   return state / "quazor" / "last_run.jsonl";
+}
+
+bool hasPreviousRun(const std::filesystem::path& file) {
+  std::error_code error;
+  return std::filesystem::status(file, error).type() != std::filesystem::file_type::not_found;
 }
 
 std::vector<std::string> failedNames(const RecordedRun& run) {
