@@ -42,6 +42,7 @@ struct RawOptions {
   std::string logLevel;
   std::string logLimit;
   std::string format = "text";
+  ChoiceTexts choice;
   bool all = false;
   bool realTime = false;
   bool systemLog = false;
@@ -80,18 +81,22 @@ void removeMarks(RawOptions& raw) {
   const auto removeMark = [](std::string& text) {
     if (text.starts_with(kMark)) text.erase(0, 1);
   };
-  for (std::vector<std::string>* texts : {&raw.names, &raw.plugins, &raw.settings, &raw.limits, &raw.tags,
-                                          &raw.parameterFiles, &raw.records, &raw.outputs, &raw.deadlines}) {
+  for (std::vector<std::string>* texts :
+       {&raw.names, &raw.plugins, &raw.settings, &raw.limits, &raw.tags, &raw.parameterFiles, &raw.records,
+        &raw.outputs, &raw.deadlines, &raw.choice.except}) {
     std::for_each(texts->begin(), texts->end(), removeMark);
   }
   for (std::string* text : {&raw.profile, &raw.phone, &raw.record, &raw.of, &raw.seed, &raw.seeds, &raw.memory,
-                            &raw.logLimit, &raw.grace}) {
+                            &raw.logLimit, &raw.grace, &raw.choice.settle}) {
     removeMark(*text);
   }
 }
 
 void addPlugins(CLI::App& command, RawOptions& raw) {
-  addRepeatable(command, "--plugin", raw.plugins, "Load this plug-in instead of the installed one; repeatable", "FILE");
+  addRepeatable(command, "--plugin", raw.plugins,
+                "Load this plug-in instead of those in the folders of plug-ins: a file, or the name of one in these "
+                "folders; repeatable. The environment variable QUAZOR_PLUGIN_PATH names more folders",
+                "FILE|NAME");
 }
 
 void addReportOptions(CLI::App& command, RawOptions& raw, const std::vector<std::string>& formats) {
@@ -181,6 +186,7 @@ void addRecord(CLI::App& command, RawOptions& raw) {
 
 void addRunOptions(CLI::App& command, RawOptions& raw, const std::string& what) {
   command.add_flag("--all", raw.all, "Run all " + what);
+  addChoiceOptions(command, raw.choice, what);
   command
       .add_option("--phone", raw.phone,
                   "Device under test: a scenario file for a simulated phone, or linux: and a binding file for this "
@@ -261,7 +267,7 @@ void checkNames(const Options& options, const std::string& what) {
 
 Options optionsOf(const CLI::App& command, const RawOptions& raw) {
   for (const char* option : {"--plugin", "--output", "--profile", "--parameters", "--phone", "--record", "--of",
-                             "RECORD", "--memory", "--log-limit", "--grace"}) {
+                             "RECORD", "--memory", "--log-limit", "--grace", "--settle", "--except"}) {
     refuseEmpty(command, option);
   }
   Options options;
@@ -277,6 +283,7 @@ Options optionsOf(const CLI::App& command, const RawOptions& raw) {
   options.phone = raw.phone;
   checkPhone(command, options.phone);
   options.realTime = raw.realTime;
+  options.choice = choiceOf(raw.choice);
   options.inProcess = raw.inProcess;
   options.seed = parseWhole("--seed", raw.seed, 0, UINT64_MAX);
   options.seeds = parseWhole("--seeds", raw.seeds, 1, 1'000'000);
@@ -316,6 +323,7 @@ void refuseUnknownCommand(const std::vector<std::string>& arguments) {
 
 void declareLookingCommands(CLI::App& app, RawOptions& raw) {
   CLI::App& list = *app.add_subcommand("list", "List diagnostics, and experiments that no diagnostic uses");
+  addNames(list, raw.names, "A diagnostic's or experiment's");
   addPlugins(list, raw);
   addReportOptions(list, raw, {"text", "json"});
   addProcessOptions(list, raw);

@@ -2,6 +2,7 @@
 #pragma once
 
 #include "contract/log_channel.h"
+#include "host/cli/choice_options.h"
 #include "host/error/exit_code.h"
 #include "host/limits/user_limit.h"
 #include "host/plugin/parameters.h"
@@ -44,7 +45,7 @@ inline constexpr std::string_view kCommandNames[] = {"list",   "describe", "run"
 // A parsed command line. Options that the command does not have keep their defaults.
 struct Options {
   std::vector<std::string> names;  // positional arguments: diagnostics or experiments, topics, a shell, "probe"
-  std::vector<std::filesystem::path> plugins;  // empty: the installed one
+  std::vector<std::filesystem::path> plugins;  // empty: those in the folders of plug-ins
   std::vector<ParameterOverride> settings;
   std::vector<UserLimit> limits;
   OrderedMap<std::string> tags;
@@ -55,6 +56,7 @@ struct Options {
   std::filesystem::path profile;               // empty: the installed one
   std::optional<Profile> recorded;             // the parameters of the run that is repeated
   std::filesystem::path phone;                 // a scenario, or linux:BINDING; empty: the installed healthy one
+  Choice choice;                               // of what runs, and how often
   ReportOptions report;
   std::vector<DeadlineSetting> deadlines;
   std::chrono::nanoseconds grace = kDefaultGrace;

@@ -232,7 +232,7 @@ TEST(ParseCommandLine, RefusesWrongUsage) {
       {{"list", "--format", "csv"}, "--format: csv not in {text,json}"},
       {{"describe", "A", "--format", "csv"}, "--format: csv not in {text,json}"},
       {{"describe"}, "NAME"},
-      {{"list", "A"}, "A"},
+      {{"doctor", "A"}, "A"},
       {{"list", "--realtime"}, "--realtime"},
       {{"run", "A", "--bogus"}, "--bogus"},
       {{"run", "A", "--seed"}, "--seed"},

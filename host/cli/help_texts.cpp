@@ -17,6 +17,7 @@ struct Example {
 
 constexpr Example kExamples[] = {
     {"quazor list", "list the installed diagnostics and experiments"},
+    {"quazor run --all --except 'Tessel*'", "run every diagnostic except these"},
     {"quazor describe 'CameraSync*'", "what these diagnostics do, and their parameters"},
     {"quazor run --all", "run every diagnostic on the healthy simulated phone"},
     {"quazor run CameraSyncDiagnostic.Back --set duration=10"},

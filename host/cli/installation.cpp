@@ -1,86 +1,183 @@
 #include "host/cli/installation.h"
 
+#include "base/text/nearest_name.h"
+#include "host/error/exit_code.h"
+#include "host/plugin/shared_object.h"
+#include "host/system/user_directory.h"
+
 #include <algorithm>
+#include <cstdlib>
+#include <set>
 #include <system_error>
+#include <utility>
 
 namespace quazor {
 
 namespace {
 
-constexpr const char* kPluginFile = "camera_sensor_diagnostics.so";
+namespace fs = std::filesystem;
 
-bool isThere(const std::filesystem::path& path) {
+constexpr const char* kShippedPlugin = "camera_sensor_diagnostics.so";
+
+bool isThere(const fs::path& path) {
   std::error_code ignored;
-  return std::filesystem::exists(path, ignored);
+  return fs::exists(path, ignored);
 }
 
-}  // namespace
-
-Installation::Installation(const std::filesystem::path& program)
-    : programDirectory_(program.parent_path()),
-      plugins_(programDirectory_.parent_path() / QUAZOR_PLUGIN_DIRECTORY),
-      data_(programDirectory_.parent_path() / QUAZOR_DATA_DIRECTORY) {}
-
-Installation Installation::ofThisProgram() { return Installation(std::filesystem::read_symlink("/proc/self/exe")); }
-
-std::filesystem::path Installation::defaultPlugin() const {
-  const std::filesystem::path installed = plugins_ / kPluginFile;
-  const std::filesystem::path beside = programDirectory_ / kPluginFile;
-  return !isThere(installed) && isThere(beside) ? beside : installed;
+bool isFolder(const fs::path& path) {
+  std::error_code ignored;
+  return fs::is_directory(path, ignored);
 }
 
-std::vector<std::filesystem::path> Installation::allPlugins() const {
-  std::vector<std::filesystem::path> plugins;
-  std::error_code ignored;
-  for (const auto& entry : std::filesystem::directory_iterator(defaultPlugin().parent_path(), ignored)) {
-    if (entry.path().extension() == ".so" && !entry.path().filename().string().starts_with("lib")) {
-      plugins.push_back(entry.path());
+std::vector<fs::path> foldersIn(const std::string& path) {
+  std::vector<fs::path> folders;
+  if (path.empty()) return folders;
+  for (std::size_t first = 0; first <= path.size();) {
+    const std::size_t last = std::min(path.find(':', first), path.size());
+    const std::string folder = path.substr(first, last - first);
+    if (!folder.starts_with('/')) {
+      throw CommandError(
+          ExitCode::kUsage,
+          std::string(kPluginPathVariable) + " '" + path +
+              "': " + (folder.empty() ? std::string("an entry is empty") : "the entry '" + folder + "' is relative") +
+              "; it lists absolute folders, separated by colons");
     }
+    if (!isThere(folder)) {
+      throw CommandError(ExitCode::kCannotRead,
+                         std::string(kPluginPathVariable) + ": the folder '" + folder + "' does not exist");
+    }
+    folders.emplace_back(folder);
+    first = last + 1;
+  }
+  return folders;
+}
+
+// The plug-ins in one folder, sorted by name.
+std::vector<fs::path> pluginsIn(const fs::path& folder) {
+  std::vector<fs::path> plugins;
+  std::error_code error;
+  for (fs::directory_iterator at(folder, error); !error && at != fs::directory_iterator(); at.increment(error)) {
+    const fs::path& file = at->path();
+    if (file.extension() == ".so" && !file.filename().string().starts_with("lib")) plugins.push_back(file);
+  }
+  if (error && error != std::errc::no_such_file_or_directory) {
+    throw CommandError(ExitCode::kCannotRead,
+                       "the folder of plug-ins '" + folder.string() + "' cannot be read: " + error.message());
   }
   std::sort(plugins.begin(), plugins.end());
   return plugins;
 }
 
-std::filesystem::path Installation::defaultProfile() const { return data_ / "profiles" / "default.json"; }
+}  // namespace
 
-std::filesystem::path Installation::profile(const std::filesystem::path& name) const {
-  return dataFile("profiles", name);
+UserFolders UserFolders::ofEnvironment() {
+  const char* const path = std::getenv(kPluginPathVariable);
+  return {userDirectory("XDG_DATA_HOME", ".local/share"), path == nullptr ? "" : path};
 }
 
-std::filesystem::path Installation::defaultScenario() const { return data_ / "scenarios" / "healthy.json"; }
+Installation::Installation(const fs::path& program, UserFolders user)
+    : programDirectory_(program.parent_path()),
+      plugins_(programDirectory_.parent_path() / QUAZOR_PLUGIN_DIRECTORY),
+      data_(programDirectory_.parent_path() / QUAZOR_DATA_DIRECTORY),
+      user_(std::move(user)) {}
 
-std::filesystem::path Installation::explanations() const { return data_ / "explanations"; }
-
-std::filesystem::path Installation::scenario(const std::filesystem::path& name) const {
-  return dataFile("scenarios", name);
+Installation Installation::ofThisProgram() {
+  return Installation(fs::read_symlink("/proc/self/exe"), UserFolders::ofEnvironment());
 }
+
+fs::path Installation::shippedPlugin() const {
+  const fs::path installed = plugins_ / kShippedPlugin;
+  const fs::path beside = programDirectory_ / kShippedPlugin;
+  return !isThere(installed) && isThere(beside) ? beside : installed;
+}
+
+std::vector<fs::path> Installation::pluginFolders() const {
+  std::vector<fs::path> folders = foldersIn(user_.pluginPath);
+  if (!user_.data.empty()) folders.push_back(user_.data / "plugins");
+  folders.push_back(shippedPlugin().parent_path());
+  return folders;
+}
+
+std::vector<fs::path> Installation::allPlugins() const {
+  std::set<fs::path> names;
+  std::vector<fs::path> all;
+  for (const fs::path& folder : pluginFolders()) {
+    std::vector<fs::path> plugins = pluginsIn(folder);
+    std::erase_if(plugins, [&names](const fs::path& one) { return !names.insert(one.filename()).second; });
+    all.insert(all.begin(), plugins.begin(), plugins.end());
+  }
+  return all;
+}
+
+std::vector<fs::path> Installation::defaultPlugins() const {
+  std::vector<fs::path> plugins = allPlugins();
+  std::erase_if(plugins, isLoadedOnlyWhenNamed);
+  return plugins;
+}
+
+fs::path Installation::plugin(const fs::path& name) const {
+  if (name.has_parent_path() || (isThere(name) && !isFolder(name))) return name;
+  std::vector<std::string> known;
+  for (const fs::path& one : allPlugins()) {
+    if (one.filename() == name || one.stem() == name) return one;
+    known.push_back(one.stem().string());
+  }
+  std::string list;
+  for (const std::string& one : known) list += (list.empty() ? "" : ", ") + one;
+  throw CommandError(ExitCode::kCannotRead, "the plug-in '" + name.string() +
+                                                "' does not exist, neither as a file nor in a folder of plug-ins" +
+                                                didYouMean(name.stem().string(), known) + "; the plug-ins there are " +
+                                                (list.empty() ? "none" : list));
+}
+
+fs::path Installation::defaultProfile() const { return data_ / "profiles" / "default.json"; }
+
+fs::path Installation::profile(const fs::path& name) const { return dataFile("profiles", name); }
+
+fs::path Installation::defaultScenario() const { return data_ / "scenarios" / "healthy.json"; }
+
+std::vector<fs::path> Installation::explanations() const {
+  std::vector<fs::path> folders = dataFolders("explanations");
+  if (folders.size() > 1 && !isThere(folders.front())) folders.erase(folders.begin());
+  return folders;
+}
+
+fs::path Installation::scenario(const fs::path& name) const { return dataFile("scenarios", name); }
 
 std::vector<std::string> Installation::scenarioNames() const { return dataNames("scenarios"); }
 
-std::filesystem::path Installation::binding(const std::filesystem::path& name) const {
-  return dataFile("bindings", name);
-}
+fs::path Installation::binding(const fs::path& name) const { return dataFile("bindings", name); }
 
 std::vector<std::string> Installation::bindingNames() const { return dataNames("bindings"); }
 
-std::filesystem::path Installation::dataFile(const char* folder, const std::filesystem::path& name) const {
-  if (isThere(name) || name.is_absolute()) return name;
-  std::filesystem::path installed = data_ / folder / name;
-  installed += ".json";
-  return isThere(installed) ? installed : name;
+std::vector<fs::path> Installation::dataFolders(const char* kind) const {
+  std::vector<fs::path> folders;
+  if (!user_.data.empty()) folders.push_back(user_.data / kind);
+  folders.push_back(data_ / kind);
+  return folders;
 }
 
-std::vector<std::string> Installation::dataNames(const char* folder) const {
-  const std::filesystem::path directory = data_ / folder;
-  std::vector<std::string> names;
-  std::error_code ignored;
-  for (const auto& entry : std::filesystem::recursive_directory_iterator(directory, ignored)) {
-    std::filesystem::path name = std::filesystem::relative(entry.path(), directory, ignored);
-    if (name.extension() != ".json" || name.stem().extension() == ".schema") continue;
-    names.push_back(name.replace_extension().string());
+fs::path Installation::dataFile(const char* kind, const fs::path& name) const {
+  if (isThere(name) || name.is_absolute()) return name;
+  for (const fs::path& folder : dataFolders(kind)) {
+    fs::path file = folder / name;
+    file += ".json";
+    if (isThere(file)) return file;
   }
-  std::sort(names.begin(), names.end());
-  return names;
+  return name;
+}
+
+std::vector<std::string> Installation::dataNames(const char* kind) const {
+  std::set<std::string> names;
+  std::error_code ignored;
+  for (const fs::path& folder : dataFolders(kind)) {
+    for (const auto& entry : fs::recursive_directory_iterator(folder, ignored)) {
+      fs::path name = fs::relative(entry.path(), folder, ignored);
+      if (name.extension() != ".json" || name.stem().extension() == ".schema") continue;
+      names.insert(name.replace_extension().string());
+    }
+  }
+  return {names.begin(), names.end()};
 }
 
 }  // namespace quazor

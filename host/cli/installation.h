@@ -1,4 +1,4 @@
-// Where the program finds the plug-in, scenarios and profile it was installed with.
+// Where the program finds plug-ins, scenarios, bindings, profiles and explanations.
 #pragma once
 
 #include <filesystem>
@@ -7,40 +7,69 @@
 
 namespace quazor {
 
+// What a user adds to an installation.
+struct UserFolders {
+  std::filesystem::path data;  // the user's own plug-ins, scenarios and so on; empty: none
+  std::string pluginPath;      // more folders with plug-ins, separated by colons
+
+  // $XDG_DATA_HOME/quazor and QUAZOR_PLUGIN_PATH.
+  static UserFolders ofEnvironment();
+};
+
+// The environment variable with more folders of plug-ins.
+inline constexpr const char* kPluginPathVariable = "QUAZOR_PLUGIN_PATH";
+
 // An installation, found relative to the program: PREFIX/bin/quazor. A build tree has the same layout.
+//
+// Plug-ins are searched in the folders of QUAZOR_PLUGIN_PATH, in the user's folder and in the installed one, in this
+// order, and data in the user's folder and in the installed one. A file hides one of the same name in a later folder.
+// Folders that do not exist are skipped, except those that QUAZOR_PLUGIN_PATH names.
+//
 // Thread: one at a time; any number may read while none writes.
 class Installation {
  public:
-  explicit Installation(const std::filesystem::path& program);
+  explicit Installation(const std::filesystem::path& program, UserFolders user = {});
 
   // The installation of the running program.
   static Installation ofThisProgram();
 
-  // The plug-in that is loaded by default: the installed one or, if there is none, the one next to the program.
-  std::filesystem::path defaultPlugin() const;
-  // All plug-ins in the directory of defaultPlugin(), sorted by name.
+  // The shipped plug-in: the installed one or, if there is none, the one next to the program.
+  std::filesystem::path shippedPlugin() const;
+  // All plug-ins in the folders above: the installed ones first, those of a folder sorted by name. Throws a
+  // CommandError for a folder that cannot be read (kCannotRead), and for an entry of QUAZOR_PLUGIN_PATH that is empty
+  // or relative (kUsage).
   std::vector<std::filesystem::path> allPlugins() const;
+  // Those that are loaded if the user names none. Throws like allPlugins().
+  std::vector<std::filesystem::path> defaultPlugins() const;
+  // Resolves the argument of `--plugin`: returns `name` if it is a path or a file, else the plug-in NAME or NAME.so in
+  // the folders above. Throws a CommandError (kCannotRead), which lists what there is, if there is none; and like
+  // allPlugins().
+  std::filesystem::path plugin(const std::filesystem::path& name) const;
   std::filesystem::path defaultProfile() const;
-  // Resolves the argument of `--profile` like scenario(), among the installed profiles.
+  // Resolves the argument of `--profile` like scenario(), among the profiles.
   std::filesystem::path profile(const std::filesystem::path& name) const;
   std::filesystem::path defaultScenario() const;
-  std::filesystem::path explanations() const;  // the directory of the explanations
-  // Resolves the argument of `--phone`: returns `name` if that file exists, else the installed scenario of that name
-  // (for example "camera_sync/start_refused") if there is one, else `name` unchanged.
+  // The folders with explanations, those of the user first.
+  std::vector<std::filesystem::path> explanations() const;
+  // Resolves the argument of `--phone`: returns `name` if that file exists, else the scenario of that name (for example
+  // "camera_sync/start_refused") in the folders above if there is one, else `name` unchanged.
   std::filesystem::path scenario(const std::filesystem::path& name) const;
-  // The names of all installed scenarios, sorted, as scenario() accepts them.
+  // The names of all scenarios in these folders, sorted, as scenario() accepts them.
   std::vector<std::string> scenarioNames() const;
-  // Resolves the NAME of `--phone linux:NAME` in the same way, among the installed bindings.
+  // Resolves the NAME of `--phone linux:NAME` in the same way, among the bindings.
   std::filesystem::path binding(const std::filesystem::path& name) const;
   std::vector<std::string> bindingNames() const;
 
  private:
-  std::filesystem::path dataFile(const char* folder, const std::filesystem::path& name) const;
-  std::vector<std::string> dataNames(const char* folder) const;
+  std::vector<std::filesystem::path> pluginFolders() const;
+  std::vector<std::filesystem::path> dataFolders(const char* kind) const;
+  std::filesystem::path dataFile(const char* kind, const std::filesystem::path& name) const;
+  std::vector<std::string> dataNames(const char* kind) const;
 
   std::filesystem::path programDirectory_;
   std::filesystem::path plugins_;
   std::filesystem::path data_;
+  UserFolders user_;
 };
 
 }  // namespace quazor

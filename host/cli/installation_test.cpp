@@ -2,6 +2,7 @@
 
 #include "host/testing/test_directory.h"
 
+#include <gmock/gmock.h>
 #include <gtest/gtest.h>
 
 namespace quazor {
@@ -16,18 +17,18 @@ class InstallationTest : public testing::Test {
 };
 
 TEST_F(InstallationTest, FindsItsFilesFromThePlaceOfTheProgram) {
-  EXPECT_EQ(installation().defaultPlugin(), prefix_ / QUAZOR_PLUGIN_DIRECTORY / "camera_sensor_diagnostics.so");
+  EXPECT_EQ(installation().shippedPlugin(), prefix_ / QUAZOR_PLUGIN_DIRECTORY / "camera_sensor_diagnostics.so");
   EXPECT_EQ(installation().defaultProfile(), prefix_ / QUAZOR_DATA_DIRECTORY / "profiles/default.json");
   EXPECT_EQ(installation().defaultScenario(), prefix_ / QUAZOR_DATA_DIRECTORY / "scenarios/healthy.json");
-  EXPECT_EQ(installation().explanations(), prefix_ / QUAZOR_DATA_DIRECTORY / "explanations");
+  EXPECT_THAT(installation().explanations(), testing::ElementsAre(prefix_ / QUAZOR_DATA_DIRECTORY / "explanations"));
 }
 
 TEST_F(InstallationTest, TakesThePluginBesideTheProgramWhereNoneIsInstalled) {
   const std::filesystem::path beside = directory_.write("bin/camera_sensor_diagnostics.so", "");
-  EXPECT_EQ(installation().defaultPlugin(), beside);
+  EXPECT_EQ(installation().shippedPlugin(), beside);
   const std::filesystem::path installed =
       directory_.write(std::filesystem::path(QUAZOR_PLUGIN_DIRECTORY) / "camera_sensor_diagnostics.so", "");
-  EXPECT_EQ(installation().defaultPlugin(), installed);
+  EXPECT_EQ(installation().shippedPlugin(), installed);
 }
 
 TEST_F(InstallationTest, FindsAnInstalledScenarioByItsName) {

@@ -20,7 +20,9 @@ EXPERIMENTS = str(PLUGINS / "experiments_plugin.so")
 # Default directory for the record of the previous run.
 STATE = tempfile.TemporaryDirectory()
 os.environ["XDG_STATE_HOME"] = STATE.name
-os.environ.pop("QUAZOR_SET", None)
+os.environ["XDG_DATA_HOME"] = STATE.name  # without any plug-in or scenario
+for variable in ("QUAZOR_SET", "QUAZOR_PLUGIN_PATH"):
+    os.environ.pop(variable, None)
 
 SCENARIO = {
     "title": "One camera",

@@ -10,6 +10,8 @@
 #include "host/system/output_file.h"
 #include "host/text/table.h"
 
+#include <algorithm>
+#include <iterator>
 #include <sstream>
 #include <utility>
 
@@ -25,16 +27,27 @@ ExitCode reportFailed(const std::vector<FailedPlugin>& failed, Console& console,
   return failed.empty() ? otherwise : ExitCode::kCannotRead;
 }
 
+// What the names select, or everything except the experiments of diagnostics.
+std::vector<Diagnostic> toList(std::vector<Diagnostic> all, const Options& options, bool mayBeNone) {
+  if (!options.names.empty()) return wantedOf(all, options, mayBeNone);
+  std::erase_if(all, [](const Diagnostic& one) { return !one.usedBy.empty(); });
+  return all;
+}
+
 ExitCode list(const Options& options, const Installation& installation, Console& console) {
   // The summary of a diagnostic is known without a description; that of an experiment is not.
-  const auto aloneAndUnused = [](std::vector<Diagnostic> all) {
-    std::erase_if(all, [](const Diagnostic& one) { return !one.experimentOnly || !one.usedBy.empty(); });
-    return all;
+  const auto toDescribe = [&options](const std::vector<Diagnostic>& all) {
+    std::vector<Diagnostic> described = toList(all, options, true);
+    std::erase_if(described, [](const Diagnostic& one) { return !one.experimentOnly; });
+    return described;
   };
-  const PluginScan scan = scanOf(options, installation, aloneAndUnused);
+  const PluginScan scan = scanOf(options, installation, toDescribe);
+  std::vector<Diagnostic> catalogue;
+  for (const DescribedDiagnostic& one : scan.catalogue) catalogue.push_back(one.diagnostic);
   std::vector<DescribedDiagnostic> listed;
-  for (const DescribedDiagnostic& one : scan.catalogue) {
-    if (one.diagnostic.usedBy.empty()) listed.push_back(one);
+  for (const Diagnostic& one : toList(catalogue, options, !scan.failed.empty())) {
+    std::copy_if(scan.catalogue.begin(), scan.catalogue.end(), std::back_inserter(listed),
+                 [&one](const DescribedDiagnostic& candidate) { return contains({one}, candidate.diagnostic); });
   }
   std::ostringstream text;
   if (options.report.format == Format::kJson) {
@@ -117,13 +130,14 @@ ExitCode runArguments(const std::vector<std::string>& arguments, const Installat
     return ExitCode::kAllPassed;
   }
   ExitCode code = ExitCode::kInternal;
-  const std::optional<Options> options = parseCommandLine(arguments, console.out, console.err, &code);
+  std::optional<Options> options = parseCommandLine(arguments, console.out, console.err, &code);
   if (!options) return code;
   const auto refused = [&console](const InputError& error, ExitCode because) {
     console.err << "quazor: " << printable(error.what()) << '\n';
     return because;
   };
   try {
+    for (std::filesystem::path& plugin : options->plugins) plugin = installation.plugin(plugin);
     return perform(*options, installation, console);
   } catch (const CommandError& error) {
     return refused(error, error.code());

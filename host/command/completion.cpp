@@ -67,12 +67,23 @@ class Completer {
     if (option == "--only") return {"failed"};
     if (option == "--log-limit" || option == "--memory") return {"none"};
     if (option == "--phone") return phones();
+    if (option == "--plugin") return plugins();
     if (option == "--deadline") {
       std::vector<std::string> stages;
       for (const Stage stage : kStages) stages.push_back(std::string(nameOf(stage)) + "=");
       return stages;
     }
+    if (option == "--except") return operands();
     return option == "--set" ? parameters() : std::vector<std::string>();
+  }
+
+  std::vector<std::string> plugins() const {
+    std::vector<std::string> names;
+    try {
+      for (const std::filesystem::path& file : installation_.allPlugins()) names.push_back(file.stem().string());
+    } catch (const InputError&) {  // a folder cannot be read; the command itself says so
+    }
+    return names;
   }
 
   std::vector<std::string> phones() const {
@@ -87,7 +98,10 @@ class Completer {
     if (command == "completion") return {"bash", "zsh"};
     if (command == "phone") return {"probe"};
     std::vector<std::string> names;
-    if (command != "run" && command != "describe" && command != "experiment" && command != "explain") return names;
+    if (command != "run" && command != "describe" && command != "experiment" && command != "explain" &&
+        command != "list") {
+      return names;
+    }
     for (const DescribedDiagnostic& one : catalogue(false)) {
       const bool experimentOnly = one.diagnostic.experimentOnly;
       if ((command == "run" && experimentOnly) || (command == "experiment" && !experimentOnly)) continue;
@@ -108,10 +122,10 @@ class Completer {
 
   std::vector<DescribedDiagnostic> catalogue(bool described) const {
     Options options;
-    for (std::size_t i = 1; i + 1 < words_.size(); ++i) {
-      if (words_[i] == "--plugin") options.plugins.emplace_back(words_[i + 1]);
-    }
     try {
+      for (std::size_t i = 1; i + 1 < words_.size(); ++i) {
+        if (words_[i] == "--plugin") options.plugins.push_back(installation_.plugin(words_[i + 1]));
+      }
       std::vector<DescribedDiagnostic> all =
           scanOf(options, installation_, [described](const std::vector<Diagnostic>& everything) {
             return described ? everything : std::vector<Diagnostic>();

@@ -5,6 +5,7 @@
 #include "host/command/selection.h"
 #include "host/device/phone.h"
 #include "host/plugin/profile.h"
+#include "host/plugin/shared_object.h"
 #include "host/record/previous_run.h"
 #include "host/text/table.h"
 
@@ -27,7 +28,7 @@ class Doctor {
     std::vector<std::filesystem::path> plugins = options_.plugins;
     if (plugins.empty()) plugins = installation_.allPlugins();
     if (plugins.empty()) {
-      tell(false, "plug-in", installation_.defaultPlugin().string(), "no plug-in found in this directory");
+      tell(false, "plug-in", installation_.shippedPlugin().string(), "no plug-in found in this directory");
     }
     for (const std::filesystem::path& plugin : plugins) {
       check("plug-in", plugin.string(), [&] { return findingOfPlugin(plugin); });
@@ -39,7 +40,7 @@ class Doctor {
              countText(read.experiments.size(), "experiment");
     });
     checkPhones();
-    check("explanations", installation_.explanations().string(),
+    check("explanations", installation_.explanations().back().string(),
           [&] { return countText(readExplanations(installation_.explanations()).size(), "explanation"); });
     checkLastRun();
     console_.out.flush();
@@ -78,7 +79,8 @@ class Doctor {
       }
       if (!one.diagnostic.experimentOnly) ++diagnostics;
     }
-    return countText(diagnostics, "diagnostic") + ", " + countText(scan.catalogue.size() - diagnostics, "experiment");
+    return countText(diagnostics, "diagnostic") + ", " + countText(scan.catalogue.size() - diagnostics, "experiment") +
+           (isLoadedOnlyWhenNamed(plugin) ? "; loaded only if --plugin names it" : "");
   }
 
   void checkPhones() {

@@ -47,7 +47,7 @@ class DoctorTest(DoctorCase):
         self.assertTrue(all(fine for fine, _, _ in found))
         findings = {name.rsplit("/", 1)[-1]: finding for _, name, finding in found}
         self.assertEqual(findings["camera_sensor_diagnostics.so"], "4 diagnostics, 4 experiments")
-        self.assertEqual(findings["sensor_images.so"], "0 diagnostics, 1 experiment")
+        self.assertEqual(findings["sensor_images.so"], "0 diagnostics, 1 experiment; loaded only if --plugin names it")
         self.assertRegex(findings["backend simulated"], r"^created the healthy phone; \d+ phones installed$")
         self.assertEqual(findings["last_run.jsonl"], "no run recorded yet")
 

@@ -126,9 +126,9 @@ Explanations explanationsFor(const std::vector<Explanation>& all, const std::vec
 
 }  // namespace
 
-void explain(const std::vector<std::string>& asked, const std::filesystem::path& directory, bool json,
+void explain(const std::vector<std::string>& asked, const std::vector<std::filesystem::path>& directories, bool json,
              std::ostream& out) {
-  const std::vector<Explanation> all = readExplanations(directory);
+  const std::vector<Explanation> all = readExplanations(directories);
   const Explanations found = explanationsFor(all, asked);
   if (json) {
     Json document{{"schema", kDocumentSchema}, {"explanations", Json::array()}};

@@ -34,7 +34,7 @@ class Explain : public testing::Test {
 
   std::string text(const std::vector<std::string>& asked, bool json = false) const {
     std::ostringstream out;
-    explain(asked, directory_.path(), json, out);
+    explain(asked, {directory_.path()}, json, out);
     return out.str();
   }
 
@@ -136,13 +136,13 @@ TEST_F(Explain, WritesOneJsonDocument) {
 
 TEST_F(Explain, WritesNothingWhenOneOfTheNamesHasNoExplanation) {
   std::ostringstream out;
-  EXPECT_THROW(explain({"Light", "Lihgt"}, directory_.path(), false, out), CommandError);
+  EXPECT_THROW(explain({"Light", "Lihgt"}, {directory_.path()}, false, out), CommandError);
   EXPECT_EQ(out.str(), "");
 }
 
 TEST(ExplainWithoutExplanations, IsRefused) {
   std::ostringstream out;
-  EXPECT_THROW(explain({}, "/nowhere", false, out), InputError);
+  EXPECT_THROW(explain({}, {"/nowhere"}, false, out), InputError);
 }
 
 }  // namespace

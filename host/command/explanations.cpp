@@ -118,16 +118,19 @@ std::vector<std::string> keysOf(const Explanation& explanation) {
   return explanation.names;
 }
 
-std::vector<std::filesystem::path> filesIn(const std::filesystem::path& directory) {
-  std::error_code problem;
-  std::vector<std::filesystem::path> files;
-  for (const auto& entry : std::filesystem::directory_iterator(directory, problem)) {
-    const std::filesystem::path& file = entry.path();
-    if (file.extension() == ".json" && file.stem().extension() != ".schema") files.push_back(file);
+std::vector<std::filesystem::path> filesIn(const std::vector<std::filesystem::path>& directories) {
+  std::map<std::filesystem::path, std::filesystem::path> files;  // from the name
+  for (const std::filesystem::path& directory : directories) {
+    std::error_code problem;
+    for (const auto& entry : std::filesystem::directory_iterator(directory, problem)) {
+      const std::filesystem::path& file = entry.path();
+      if (file.extension() == ".json" && file.stem().extension() != ".schema") files.emplace(file.filename(), file);
+    }
+    if (problem) refuse(directory.string(), problem.message() + ".");
   }
-  if (problem) refuse(directory.string(), problem.message() + ".");
-  std::sort(files.begin(), files.end());
-  return files;
+  std::vector<std::filesystem::path> sorted;
+  for (const auto& [name, file] : files) sorted.push_back(file);
+  return sorted;
 }
 
 std::optional<std::int64_t> integerOf(std::string_view text) {
@@ -218,10 +221,10 @@ std::vector<Explanation> parseExplanations(const std::string& file, std::string_
   return explanationsOf(JsonCursor(JsonDocument(std::string(text), file)));
 }
 
-std::vector<Explanation> readExplanations(const std::filesystem::path& directory) {
+std::vector<Explanation> readExplanations(const std::vector<std::filesystem::path>& directories) {
   std::vector<Explanation> all;
   std::map<std::string, std::string> seen;  // from each explained error or name to its file
-  for (const std::filesystem::path& file : filesIn(directory)) {
+  for (const std::filesystem::path& file : filesIn(directories)) {
     for (Explanation& one : explanationsOf(JsonCursor(JsonDocument::read(file)))) {
       for (const std::string& key : keysOf(one)) {
         const auto [earlier, isNew] = seen.emplace(key, file.string());
@@ -230,7 +233,7 @@ std::vector<Explanation> readExplanations(const std::filesystem::path& directory
       all.push_back(std::move(one));
     }
   }
-  if (all.empty()) refuse(directory.string(), "the directory contains none.");
+  if (all.empty()) refuse(directories.back().string(), "the directory contains none.");
   return all;
 }
 

@@ -44,9 +44,10 @@ std::string keyOf(std::string_view domain, std::int64_t code);
 // documented form.
 std::vector<Explanation> parseExplanations(const std::string& file, std::string_view text);
 
-// Reads all NAME.json files of a directory except NAME.schema.json, in the order of their names. Throws InputError if a
-// file cannot be read, if there are no explanations, or if two explain the same thing.
-std::vector<Explanation> readExplanations(const std::filesystem::path& directory);
+// Reads all NAME.json files of the directories except NAME.schema.json, in the order of their names. A file hides those
+// of the same name in later directories. Throws InputError if a file cannot be read, if there are no explanations, or
+// if two explain the same thing.
+std::vector<Explanation> readExplanations(const std::vector<std::filesystem::path>& directories);
 
 // The explanations that `asked` selects, in their order. `asked` is DOMAIN:CODE, a code, a domain, a name, a pattern of
 // names (*, ?, [...]) or the name of a code in the source. Throws a CommandError (kUsage), which suggests the nearest

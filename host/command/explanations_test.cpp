@@ -140,7 +140,7 @@ TEST(ReadExplanations, ReadsTheFilesOfADirectoryInTheOrderOfTheirNames) {
   directory.write("a.json", names(kDiagnostic));
   directory.write("c.schema.json", "{}");
   directory.write("d.txt", "no JSON");
-  const std::vector<Explanation> all = readExplanations(directory.path());
+  const std::vector<Explanation> all = readExplanations({directory.path()});
   ASSERT_EQ(all.size(), 2U);
   EXPECT_THAT(all[0].names, ElementsAre("D"));
   EXPECT_EQ(all[1].domain, "B");
@@ -168,10 +168,10 @@ TEST(ReadExplanations, RefusesWhatItCannotUse) {
   for (const Row& row : rows) {
     const TestDirectory directory;
     for (const auto& [name, text] : row.files) directory.write(name, text);
-    EXPECT_THAT(thrownText<InputError>([&] { readExplanations(directory.path()); }), testing::HasSubstr(row.problem))
+    EXPECT_THAT(thrownText<InputError>([&] { readExplanations({directory.path()}); }), testing::HasSubstr(row.problem))
         << row.name;
   }
-  EXPECT_EQ(thrownText<InputError>([] { readExplanations("/nowhere"); }),
+  EXPECT_EQ(thrownText<InputError>([] { readExplanations({"/nowhere"}); }),
             "the explanations in '/nowhere' cannot be used: No such file or directory.");
 }
 

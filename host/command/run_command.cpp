@@ -17,7 +17,9 @@
 #include <unistd.h>
 
 #include <algorithm>
+#include <chrono>
 #include <optional>
+#include <thread>
 #include <utility>
 
 namespace quazor {
@@ -39,6 +41,15 @@ class Conductor {
       : isolation_(std::move(isolation)), runOptions_(std::move(runOptions)), signals_(signals), events_(events) {}
 
   bool isInterrupted() const { return signals_ != nullptr && signals_->requestsToEnd() > 0; }
+
+  // Waits between two jobs, or until the user interrupts.
+  void settle(std::chrono::nanoseconds time) const {
+    if (signals_ == nullptr) {
+      std::this_thread::sleep_for(time);  // an interrupt ends the process
+    } else {
+      signals_->wait(time);
+    }
+  }
 
   // Returns the diagnostic that the user interrupted, as in RunEnded; nothing if the run continues.
   std::optional<std::string> perform(const Job& job) {
@@ -110,6 +121,12 @@ EventPipelineOptions eventOptions(const Options& options, bool keepsLastRun) {
   return {options.record, keepsLastRun, options.systemLog, options.report, options.logLimit};
 }
 
+// The time to wait between two diagnostics. Each gets a new phone, so the time of one that is simulated passes at once.
+std::chrono::nanoseconds realSettleOf(const Options& options) {
+  const bool isSimulated = !bindingNamed(options.phone) && !options.realTime;
+  return isSimulated ? std::chrono::nanoseconds::zero() : options.choice.settle;
+}
+
 ExitCode perform(const Options& options, const Installation& installation, Console& console, RunStarted began,
                  const std::vector<Job>& jobs, const std::vector<FailedPlugin>& failed, const RunOptions& runOptions,
                  WatchedSignals* signals) {
@@ -127,8 +144,16 @@ ExitCode perform(const Options& options, const Installation& installation, Conso
     events.onEvent(RunEnded{"", dateNow()});
     return ExitCode::kInterrupted;
   }
+  const std::chrono::nanoseconds settle = realSettleOf(options);
+  bool isFirst = true;
   for (const Job& job : jobs) {
-    if (std::optional<std::string> interrupted = conductor.perform(job)) {
+    std::optional<std::string> interrupted;
+    if (!std::exchange(isFirst, false) && settle.count() > 0) {
+      conductor.settle(settle);
+      if (conductor.isInterrupted()) interrupted = "";
+    }
+    if (!interrupted) interrupted = conductor.perform(job);
+    if (interrupted) {
       events.onEvent(RunEnded{std::move(interrupted), dateNow()});
       return ExitCode::kInterrupted;
     }

@@ -5,6 +5,7 @@
 #include "host/plugin/profile.h"
 
 #include <algorithm>
+#include <cstddef>
 #include <optional>
 #include <system_error>
 #include <utility>
@@ -26,7 +27,7 @@ std::vector<Diagnostic> allWanted(const std::vector<Diagnostic>& catalogue, Want
   throw CommandError(ExitCode::kUsage, "the loaded plug-ins have no diagnostics" + hint);
 }
 
-std::vector<Diagnostic> wantedOf(const std::vector<Diagnostic>& catalogue, const Options& options, bool mayBeNone) {
+std::vector<Diagnostic> namedBy(const std::vector<Diagnostic>& catalogue, const Options& options, bool mayBeNone) {
   const Wanted wanted = wantedBy(options.command);
   if (options.all) return allWanted(catalogue, wanted, mayBeNone);
   std::vector<std::string> names = options.names;
@@ -37,6 +38,14 @@ std::vector<Diagnostic> wantedOf(const std::vector<Diagnostic>& catalogue, const
     });
   }
   return selectDiagnostics(catalogue, wanted, names);
+}
+
+// Removes what the pattern of --except fits.
+void leaveOut(const std::string& pattern, bool mayBeNone, std::vector<Diagnostic>& selected) {
+  const std::size_t removed =
+      std::erase_if(selected, [&pattern](const Diagnostic& one) { return matchesName(pattern, one.name); });
+  if (removed > 0 || mayBeNone) return;
+  throw CommandError(ExitCode::kUsage, "--except '" + pattern + "' fits nothing of what is selected to run");
 }
 
 std::vector<Profile> profilesOf(const Options& options, const Installation& installation) {
@@ -81,6 +90,15 @@ void describeForProfiles(const Options& options, const Installation& installatio
 
 }  // namespace
 
+std::vector<Diagnostic> wantedOf(const std::vector<Diagnostic>& catalogue, const Options& options, bool mayBeNone) {
+  std::vector<Diagnostic> selected = namedBy(catalogue, options, mayBeNone);
+  for (const std::string& pattern : options.choice.except) leaveOut(pattern, mayBeNone, selected);
+  if (selected.empty() && !options.choice.except.empty() && !mayBeNone) {
+    throw CommandError(ExitCode::kUsage, "--except leaves nothing to run");
+  }
+  return selected;
+}
+
 std::vector<std::filesystem::path> recordedPlugins(const std::vector<std::string>& recorded,
                                                    const Installation& installation) {
   const std::vector<std::filesystem::path> installed = installation.allPlugins();
@@ -102,16 +120,19 @@ std::vector<std::filesystem::path> recordedPlugins(const std::vector<std::string
 
 IsolationOptions isolationOf(const Options& options, const Installation& installation) {
   IsolationOptions isolation{options.plugins, options.memory, options.deadlines, options.grace};
-  if (isolation.plugins.empty()) isolation.plugins.push_back(installation.defaultPlugin());
+  if (!isolation.plugins.empty()) return isolation;
+  isolation.plugins = installation.defaultPlugins();
+  isolation.unasked = !isolation.plugins.empty();
+  if (!isolation.unasked) isolation.plugins.push_back(installation.shippedPlugin());  // to be told that it is missing
   return isolation;
 }
 
 PluginScan scanOf(const Options& options, const Installation& installation, const DiagnosticChoice& described,
                   WatchedSignals* signals) {
   const IsolationOptions isolation = isolationOf(options, installation);
-  requireTrustedPlugins(isolation.plugins);
   PluginScan scan;
   if (options.inProcess) {
+    requireTrustedPlugins(isolation.plugins);
     loadPlugins(isolation.plugins);
     const std::vector<Diagnostic> catalogue = catalogueOf(QZLab::defaultLab());
     const std::vector<Diagnostic> wanted = described(catalogue);

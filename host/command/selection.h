@@ -17,7 +17,7 @@ struct Selection {
   std::vector<UserLimit> limits;     // of the profiles and the command line, in this order
 };
 
-// The plug-ins that the options name, or the installed one, and the limits of their processes.
+// The plug-ins that the options name, or those that are loaded by default, and the limits of their processes.
 IsolationOptions isolationOf(const Options& options, const Installation& installation);
 
 // The installed plug-ins of a record. Anybody may have written it, so it cannot make quazor load any other file: throws
@@ -25,9 +25,14 @@ IsolationOptions isolationOf(const Options& options, const Installation& install
 std::vector<std::filesystem::path> recordedPlugins(const std::vector<std::string>& recorded,
                                                    const Installation& installation);
 
+// The diagnostics or experiments that the options select, in the order of their names. Throws a CommandError (kUsage)
+// for a name or a pattern that fits nothing, unless `mayBeNone`.
+std::vector<Diagnostic> wantedOf(const std::vector<Diagnostic>& catalogue, const Options& options, bool mayBeNone);
+
 // Scans the plug-ins in separate processes, or in this one with --in-process. `described` chooses the diagnostics that
-// are asked for their descriptions. Throws a CommandError if a plug-in cannot be loaded or others may change it, and
-// kInterrupted on an interrupt. `signals` is the command's; null: they are watched during the scan only.
+// are asked for their descriptions. Throws like scanPlugins() and Installation::allPlugins(), and kInterrupted on an
+// interrupt. In this process, a plug-in that is refused always is a CommandError: its code could not be removed.
+// `signals` is the command's; null: they are watched during the scan only.
 PluginScan scanOf(const Options& options, const Installation& installation, const DiagnosticChoice& described,
                   WatchedSignals* signals = nullptr);
 

@@ -259,10 +259,14 @@ TEST_F(SelectionTest, IsolatesTheInstalledPluginWhenNoneIsNamed) {
   options_.memory = 5;
   options_.deadlines = {{Stage::kRun, std::chrono::seconds(1)}};
   const IsolationOptions isolation = isolationOf(options_, installation);
-  EXPECT_THAT(isolation.plugins, ElementsAre(installation.defaultPlugin()));
+  EXPECT_THAT(isolation.plugins, ElementsAre(installation.shippedPlugin()));
   EXPECT_EQ(isolation.memory, 5U);
   EXPECT_EQ(isolation.deadlines.size(), 1U);
+  EXPECT_FALSE(isolation.unasked);
+  directory_.write(std::filesystem::path(QUAZOR_PLUGIN_DIRECTORY) / "shipped.so", "");
+  EXPECT_TRUE(isolationOf(options_, installation).unasked);
   options_.plugins = {"a.so", "b.so"};
+  EXPECT_FALSE(isolationOf(options_, installation).unasked);
   EXPECT_THAT(isolationOf(options_, installation).plugins, ElementsAre("a.so", "b.so"));
 }
 

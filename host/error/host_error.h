@@ -31,6 +31,7 @@ enum class HostErrorCode : std::int64_t {
   kNoProcess = 12,           // the process for the diagnostic could not be created
   kTooDeep = 13,             // the plug-in gave a value that is nested too deeply to be recorded
   kLimitWithoutResult = 14,  // a user-defined limit fits no result of the run
+  kPluginRefused = 15,       // a file in a folder of plug-ins was refused, so none of its code ran or counts
 };
 
 DiagnosticErrorPtr hostError(HostErrorCode code, std::string message);

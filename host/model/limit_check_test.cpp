@@ -1,5 +1,6 @@
 #include "host/model/limit_check.h"
 
+#include "contract/message_format.h"
 #include "host/error/host_error.h"
 #include "host/model/diagnostic_record.h"
 #include "host/model/judge.h"
@@ -119,6 +120,34 @@ TEST(LimitCheck, SaysWhyAComparisonIsImpossible) {
     EXPECT_EQ(judged.error->code(), static_cast<std::int64_t>(HostErrorCode::kCannotBeJudged));
     EXPECT_EQ(judged.error->localizedDescription(), checks[0].problem);
   }
+}
+
+TEST(LimitCheck, HasTheBoundsOfItsConditionInTheUnitOfTheResult) {
+  struct Row {
+    const char* limit;
+    const char* lower;  // "" for none, as is `upper`
+    const char* upper;
+  };
+  constexpr Row kRows[] = {
+      {"A < 5", "", "5 ms open"},           {"A <= 5", "", "5 ms"},
+      {"A > 5", "5 ms open", ""},           {"A >= 5", "5 ms", ""},
+      {"A == 5 +- 1", "4 ms", "6 ms"},      {"A in [1, 2)", "1 ms", "2 ms open"},
+      {"A in (1, 2]", "1 ms open", "2 ms"},
+  };
+  const auto textOf = [](const std::shared_ptr<const QZBound>& bound) {
+    if (bound == nullptr) return std::string();
+    const Measurement& value = bound->value();
+    return formatMessage("%@ %@", value.value(), value.unit().symbol()) + (bound->open() ? " open" : "");
+  };
+  for (const Row& row : kRows) {
+    const auto checks = limitChecksOf(limitedRecord({measured("A", 3, "ms")}, {limitFrom(row.limit)}));
+    const std::optional<QZLimit> bounds = boundsOf(checks.at(0));
+    ASSERT_TRUE(bounds) << row.limit;
+    EXPECT_EQ(textOf(bounds->lowerBound()), row.lower) << row.limit;
+    EXPECT_EQ(textOf(bounds->upperBound()), row.upper) << row.limit;
+  }
+  const auto relation = limitChecksOf(limitedRecord({measured("A", 3), measured("B", 4)}, {limitFrom("A < B")}));
+  EXPECT_FALSE(boundsOf(relation.at(0))) << "a comparison of two results has none";
 }
 
 TEST(LimitCheck, TakesPatternsInTheOrderOfTheResults) {

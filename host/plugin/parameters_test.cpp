@@ -145,6 +145,17 @@ TEST(CheckProfile, ChecksTheEntriesOfExperimentsAgainstExperiments) {
   EXPECT_EQ(check(R"({"Sync.Back": {"duration": 5}})", false), "accepted");
 }
 
+TEST(CheckProfile, NamesAnEntryOfTheDiagnosticsBeforeOneOfTheExperiments) {
+  const Profile profile = parseProfile(
+      "some.json",
+      R"({"schema": 1, "experiments": {"Image": {"images": 5}}, "diagnostics": {"Bakc": {"experiment": {"x": 3}}}})");
+  EXPECT_EQ(refusalOf(ExitCode::kCannotRead,
+                      [&] {
+                        checkProfile(profile, {sync(), imagesAlone()});
+                      }),
+            "the profile 'some.json' has an entry 'Bakc', which matches no diagnostic");
+}
+
 TEST(CheckSettings, SaysWhenADiagnosticsParametersAreNotKnown) {
   EXPECT_THAT(refusalOf(ExitCode::kUsage, [] { checkOverrides(settings({"x=3"}), {undescribed()}); }),
               HasSubstr("(Broken could not be described: it threw)"));

@@ -116,15 +116,19 @@ void loadSomePlugins(const std::vector<std::filesystem::path>& files, const std:
 }
 
 void checkDiagnostics(const QZLab& lab, const std::vector<LoadedPlugin>& plugins) {
-  const std::vector<QZLab::Registration>& registrations = lab.registrations();
-  std::size_t at = 0;
+  std::size_t first = 0;
   for (const LoadedPlugin& plugin : plugins) {
-    for (; at < plugin.last; ++at) {
-      const QZLab::Registration& one = registrations[at];
-      if (one.kind != QZLab::Kind::kDiagnostic) continue;
-      checkPart(lab, plugin, one.name, QZLab::Kind::kExperiment, one.experimentName);
-      checkPart(lab, plugin, one.name, QZLab::Kind::kAnalysis, one.analysisName);
-    }
+    checkDiagnosticsOf(lab, first, plugin);
+    first = plugin.last;
+  }
+}
+
+void checkDiagnosticsOf(const QZLab& lab, std::size_t first, const LoadedPlugin& plugin) {
+  for (std::size_t at = first; at < plugin.last; ++at) {
+    const QZLab::Registration& one = lab.registrations()[at];
+    if (one.kind != QZLab::Kind::kDiagnostic) continue;
+    checkPart(lab, plugin, one.name, QZLab::Kind::kExperiment, one.experimentName);
+    checkPart(lab, plugin, one.name, QZLab::Kind::kAnalysis, one.analysisName);
   }
 }
 

@@ -48,6 +48,9 @@ void loadSomePlugins(const std::vector<std::filesystem::path>& files, const std:
 // `plugins` are those that made the registrations.
 void checkDiagnostics(const QZLab& lab, const std::vector<LoadedPlugin>& plugins);
 
+// The same for one plug-in, whose registrations begin at `first`.
+void checkDiagnosticsOf(const QZLab& lab, std::size_t first, const LoadedPlugin& plugin);
+
 // The contract version of the missing symbol in a dynamic linker's message; nothing if the message has another cause.
 std::optional<int> contractVersionIn(std::string_view linkerMessage);
 

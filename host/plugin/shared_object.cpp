@@ -1,6 +1,7 @@
 #include "host/plugin/shared_object.h"
 
 #include "base/text/input_error.h"
+#include "contract/loading.h"
 
 #include <elf.h>
 
@@ -13,7 +14,9 @@
 #include <iterator>
 #include <optional>
 #include <string>
+#include <string_view>
 #include <system_error>
+#include <vector>
 
 namespace quazor {
 
@@ -72,18 +75,47 @@ std::optional<Architecture> ownArchitecture() {
   return architectureOf(program);
 }
 
-// True if the file contains every segment that its headers list.
-bool hasAllSegments(std::ifstream& file, std::uint64_t size) {
+// The segments that the headers of a file list: none if their form is unknown, which is left to the linker. Nothing if
+// the file is too short for them.
+std::optional<std::vector<Elf64_Phdr>> segmentsOf(std::ifstream& file, std::uint64_t size) {
   Elf64_Ehdr header;
-  if (!readAt(file, 0, &header, sizeof header)) return false;
-  if (header.e_phentsize != sizeof(Elf64_Phdr)) return true;  // left to the linker
+  if (!readAt(file, 0, &header, sizeof header)) return std::nullopt;
+  std::vector<Elf64_Phdr> segments;
+  if (header.e_phentsize != sizeof(Elf64_Phdr)) return segments;
   for (std::uint64_t i = 0; i < header.e_phnum; ++i) {
     const std::uint64_t offset = header.e_phoff + i * sizeof(Elf64_Phdr);
     Elf64_Phdr segment;
-    if (!isWithin(offset, sizeof segment, size) || !readAt(file, offset, &segment, sizeof segment)) return false;
-    if (segment.p_type == PT_LOAD && !isWithin(segment.p_offset, segment.p_filesz, size)) return false;
+    if (!isWithin(offset, sizeof segment, size) || !readAt(file, offset, &segment, sizeof segment)) return std::nullopt;
+    segments.push_back(segment);
   }
-  return true;
+  return segments;
+}
+
+// True if the file contains every segment that its headers list.
+bool hasAllSegments(std::ifstream& file, std::uint64_t size) {
+  const std::optional<std::vector<Elf64_Phdr>> segments = segmentsOf(file, size);
+  return segments && std::all_of(segments->begin(), segments->end(), [size](const Elf64_Phdr& one) {
+           return one.p_type != PT_LOAD || isWithin(one.p_offset, one.p_filesz, size);
+         });
+}
+
+constexpr std::uint64_t kMaxNotes = 65536;  // of one segment, in bytes; a linker writes some hundred
+
+std::uint64_t aligned(std::uint64_t size) { return (size + 3) / 4 * 4; }
+
+// True if the notes, one after the other, contain the one of QUAZOR_LOADED_ONLY_WHEN_NAMED.
+bool haveNote(std::string_view notes) {
+  constexpr std::string_view kOwner(kNoteOwner, sizeof kNoteOwner);  // with its zero, as in the file
+  while (notes.size() >= sizeof(Elf64_Nhdr)) {
+    Elf64_Nhdr header;
+    std::memcpy(&header, notes.data(), sizeof header);
+    notes.remove_prefix(sizeof header);
+    const std::uint64_t size = aligned(header.n_namesz) + aligned(header.n_descsz);
+    if (size > notes.size()) return false;
+    if (header.n_type == kNoteLoadedOnlyWhenNamed && notes.substr(0, header.n_namesz) == kOwner) return true;
+    notes.remove_prefix(size);
+  }
+  return false;
 }
 
 }  // namespace
@@ -112,6 +144,24 @@ void validateSharedObject(const std::filesystem::path& path) {
   }
   if (architecture->size != ELFCLASS64) return;  // left to the linker
   if (!hasAllSegments(file, size)) throw InputError(kTruncated);
+}
+
+bool isLoadedOnlyWhenNamed(const std::filesystem::path& path) {
+  try {
+    validateSharedObject(path);
+  } catch (const InputError&) {
+    return false;
+  }
+  std::error_code error;
+  const std::uint64_t size = std::filesystem::file_size(path, error);
+  std::ifstream file(path, std::ios::binary);
+  const std::optional<std::vector<Elf64_Phdr>> segments = segmentsOf(file, size);
+  if (error || !segments) return false;
+  return std::any_of(segments->begin(), segments->end(), [&file, size](const Elf64_Phdr& one) {
+    if (one.p_type != PT_NOTE || one.p_filesz > kMaxNotes || !isWithin(one.p_offset, one.p_filesz, size)) return false;
+    std::string notes(one.p_filesz, '\0');
+    return readAt(file, one.p_offset, notes.data(), notes.size()) && haveNote(notes);
+  });
 }
 
 }  // namespace quazor

@@ -13,4 +13,8 @@ namespace quazor {
 // The layout is described in elf(5).
 void validateSharedObject(const std::filesystem::path& file);
 
+// True if the file has the note of QUAZOR_LOADED_ONLY_WHEN_NAMED (contract/loading.h). False for every other file, also
+// for one that validateSharedObject() refuses. No code of the file runs.
+bool isLoadedOnlyWhenNamed(const std::filesystem::path& file);
+
 }  // namespace quazor

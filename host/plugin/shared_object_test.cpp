@@ -8,6 +8,9 @@
 #include <gtest/gtest.h>
 #include <sys/stat.h>
 
+#include <cstddef>
+#include <cstdint>
+#include <cstring>
 #include <string>
 
 namespace quazor {
@@ -84,6 +87,51 @@ TEST(ValidateSharedObject, NamesAnotherArchitecture) {
     EXPECT_TRUE(problem.starts_with("is built for another architecture (" + std::string(row.name) + ") than quazor ("))
         << problem;
   }
+}
+
+TEST(IsLoadedOnlyWhenNamed, IsTrueOfAFileWithTheNote) {
+  const TestDirectory directory;
+  Elf64_Ehdr header = {};
+  std::memcpy(header.e_ident, ELFMAG, SELFMAG);
+  const std::string own = ownProgram();
+  std::memcpy(&header, own.data(), offsetof(Elf64_Ehdr, e_version));  // of this architecture
+  header.e_phoff = sizeof header;
+  header.e_phentsize = sizeof(Elf64_Phdr);
+  header.e_phnum = 1;
+  struct Note {
+    std::uint32_t ownerSize;
+    std::uint32_t contentSize;
+    std::uint32_t type;
+    char owner[8];
+  };
+  const auto isWith = [&](const Note& note, std::uint64_t size, std::uint32_t segmentType) {
+    Elf64_Phdr segment = {};
+    segment.p_type = segmentType;
+    segment.p_offset = sizeof header + sizeof segment;
+    segment.p_filesz = size;
+    std::string content(reinterpret_cast<const char*>(&header), sizeof header);
+    content.append(reinterpret_cast<const char*>(&segment), sizeof segment);
+    content.append(reinterpret_cast<const char*>(&note), sizeof note);
+    return isLoadedOnlyWhenNamed(directory.write("made.so", content));
+  };
+  const Note note = {7, 0, 1, "Quazor"};
+  EXPECT_TRUE(isWith(note, sizeof note, PT_NOTE));
+  EXPECT_FALSE(isWith({7, 0, 2, "Quazor"}, sizeof note, PT_NOTE)) << "another type";
+  EXPECT_FALSE(isWith({7, 0, 1, "Others"}, sizeof note, PT_NOTE)) << "another owner";
+  EXPECT_FALSE(isWith({8, 0, 1, "Quazor"}, sizeof note, PT_NOTE)) << "a longer name";
+  EXPECT_FALSE(isWith({0xFFFFFFFF, 0, 1, "Quazor"}, sizeof note, PT_NOTE)) << "a name that is longer than the notes";
+  EXPECT_FALSE(isWith({7, 0xFFFFFFFF, 1, "Quazor"}, sizeof note, PT_NOTE)) << "content that is longer than the notes";
+  EXPECT_FALSE(isWith(note, sizeof note - 8, PT_NOTE)) << "a cut note";
+  EXPECT_FALSE(isWith(note, sizeof note + 1, PT_NOTE)) << "notes beyond the end of the file";
+  EXPECT_FALSE(isWith(note, std::uint64_t{1} << 40U, PT_NOTE)) << "notes that fit in no memory";
+  EXPECT_FALSE(isWith(note, sizeof note, PT_NULL)) << "no segment of notes";
+}
+
+TEST(IsLoadedOnlyWhenNamed, IsFalseOfEveryOtherFile) {
+  const TestDirectory directory;
+  EXPECT_FALSE(isLoadedOnlyWhenNamed("/proc/self/exe"));
+  EXPECT_FALSE(isLoadedOnlyWhenNamed(directory.path() / "nothing.so"));
+  EXPECT_FALSE(isLoadedOnlyWhenNamed(directory.write("text.so", "hello, this is text")));
 }
 
 }  // namespace

@@ -1,29 +1,15 @@
 #include "host/record/previous_run.h"
 
+#include "host/system/user_directory.h"
+
 #include <algorithm>
-#include <cstdlib>
 #include <system_error>
 
 namespace quazor {
 
-namespace {
-
-std::filesystem::path directoryIn(const char* variable) {
-  const char* const value = std::getenv(variable);
-  // The XDG base directory rules require that relative paths are ignored.
-  return value != nullptr && *value == '/' ? value : "";
-}
-
-}  // namespace
-
 std::filesystem::path previousRunFile() {
-  std::filesystem::path state = directoryIn("XDG_STATE_HOME");
-  if (state.empty()) {
-    state = directoryIn("HOME");
-    if (state.empty()) return {};
-    state /= ".local/state";
-  }
-  return state / "quazor" / "last_run.jsonl";
+  const std::filesystem::path state = userDirectory("XDG_STATE_HOME", ".local/state");
+  return state.empty() ? state : state / "last_run.jsonl";
 }
 
 bool hasPreviousRun(const std::filesystem::path& file) {

@@ -25,7 +25,8 @@ class ConnectionWriter {
  public:
   ConnectionWriter(int descriptor, std::string token);
 
-  // Ends the process if the connection was closed or overwritten, or if this is a copy of the process that a plug-in made.
+  // Ends the process if the connection was closed or overwritten, or if this is a copy of the process that a plug-in
+  // made.
   void say(const nlohmann::ordered_json& json) const;
 
  private:

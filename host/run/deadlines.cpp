@@ -54,6 +54,14 @@ std::chrono::nanoseconds parseGrace(const std::string& text) {
   return grace;
 }
 
+std::chrono::nanoseconds parseSettle(const std::string& text) {
+  const std::string what = "--settle '" + text + "': ";
+  const std::chrono::nanoseconds settle = parseSeconds(what, text);
+  if (settle.count() < 0) throw CommandError(ExitCode::kUsage, what + "the time must not be less than zero");
+  if (settle >= kMaxLength) throw CommandError(ExitCode::kUsage, what + "the time must be less than a year");
+  return settle;
+}
+
 Deadlines::Deadlines(const ResolvedParameters& parameters, const std::vector<DeadlineSetting>& settings) {
   times_.fill(kDefault);
   if (const std::optional<double> seconds = expectedProgressOf(parameters).seconds) {

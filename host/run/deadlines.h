@@ -26,6 +26,10 @@ inline constexpr std::chrono::seconds kDefaultGrace{5};
 // The time of a --grace option: SECONDS. Throws a CommandError (kUsage) if it is no number or less than zero.
 std::chrono::nanoseconds parseGrace(const std::string& text);
 
+// The time of a --settle option: SECONDS. Throws a CommandError (kUsage) if it is no number, less than zero or a year
+// or more.
+std::chrono::nanoseconds parseSettle(const std::string& text);
+
 // Thread: any; it is immutable.
 class Deadlines {
  public:

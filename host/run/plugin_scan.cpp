@@ -6,6 +6,7 @@
 #include "host/error/exit_code.h"
 #include "host/error/host_error.h"
 #include "host/plugin/plugin_loader.h"
+#include "host/plugin/plugin_trust.h"
 #include "host/plugin/shared_object.h"
 #include "host/record/lossless_json.h"
 #include "host/record/run_event_json.h"
@@ -16,6 +17,7 @@
 #include <algorithm>
 #include <chrono>
 #include <cstddef>
+#include <memory>
 #include <optional>
 #include <string>
 #include <string_view>
@@ -287,11 +289,82 @@ class Describing {
 };
 
 void checkFile(const std::filesystem::path& file) {
+  requireTrustedPlugins({file});
   try {
     validateSharedObject(file);
   } catch (const InputError& problem) {
     refusePlugin(file, problem.what());
   }
+}
+
+// Plug-ins in the order in which they were accepted, and a lab with what they register.
+// Thread: one at a time.
+class AcceptedPlugins {
+ public:
+  // Throws a CommandError, and then accepts nothing of it, if the plug-in registers a name that is already taken.
+  void accept(const std::filesystem::path& file, const std::vector<QZLab::Registration>& registrations) {
+    plugins_.push_back({file, registrations});
+    try {
+      fillLab();
+    } catch (const CommandError&) {
+      plugins_.pop_back();
+      fillLab();
+      throw;
+    }
+  }
+
+  // Removes the plug-ins with a diagnostic that names a part which no plug-in registers.
+  std::vector<FailedPlugin> removeIncomplete() {
+    std::vector<FailedPlugin> removed;
+    std::size_t first = 0;
+    for (const LoadedPlugin& plugin : loaded_) {
+      try {
+        checkDiagnosticsOf(*lab_, first, plugin);
+      } catch (const CommandError& refusal) {
+        removed.push_back(refusedPlugin(plugin.file, refusal));
+        std::erase_if(plugins_, [&plugin](const Plugin& one) { return one.file == plugin.file; });
+      }
+      first = plugin.last;
+    }
+    if (!removed.empty()) fillLab();
+    return removed;
+  }
+
+  static FailedPlugin refusedPlugin(const std::filesystem::path& file, const CommandError& refusal) {
+    return {file, hostError(HostErrorCode::kPluginRefused, refusal.what())};
+  }
+
+  const QZLab& lab() const { return *lab_; }
+  const std::vector<LoadedPlugin>& loaded() const { return loaded_; }
+
+ private:
+  struct Plugin {
+    std::filesystem::path file;
+    std::vector<QZLab::Registration> registrations;
+  };
+
+  void fillLab() {
+    lab_ = std::make_unique<QZLab>();
+    loaded_.clear();
+    for (const Plugin& plugin : plugins_) {
+      addRegistrations(plugin.file, plugin.registrations, *lab_);
+      loaded_.push_back({plugin.file, lab_->registrations().size()});
+    }
+  }
+
+  std::vector<Plugin> plugins_;
+  std::unique_ptr<QZLab> lab_ = std::make_unique<QZLab>();
+  std::vector<LoadedPlugin> loaded_;
+};
+
+// Loads the plug-in and accepts it. Returns an error if it cannot be loaded; throws a CommandError if it is refused.
+DiagnosticErrorPtr accept(const IsolationOptions& options, const std::filesystem::path& file, WatchedSignals& signals,
+                          AcceptedPlugins& accepted) {
+  if (options.unasked) checkFile(file);
+  PluginLoading loading(options, Deadlines({}, options.deadlines), file);
+  DiagnosticErrorPtr error = loading.perform(signals);
+  if (error == nullptr && signals.requestsToEnd() == 0) accepted.accept(file, loading.registrations());
+  return error;
 }
 
 }  // namespace
@@ -302,27 +375,28 @@ IsolationOptions withoutFailed(IsolationOptions options, const std::vector<Faile
 }
 
 PluginScan scanPlugins(const IsolationOptions& options, WatchedSignals& signals, const DiagnosticChoice& described) {
-  const Deadlines deadlines({}, options.deadlines);
   const std::vector<std::filesystem::path> files = distinctFiles(options.plugins);
-  for (const std::filesystem::path& file : files) checkFile(file);
+  if (!options.unasked) std::for_each(files.begin(), files.end(), checkFile);
   PluginScan scan;
-  QZLab lab;
-  std::vector<LoadedPlugin> loaded;
+  AcceptedPlugins accepted;
   for (const std::filesystem::path& file : files) {
-    PluginLoading loading(options, deadlines, file);
-    DiagnosticErrorPtr error = loading.perform(signals);
+    try {
+      DiagnosticErrorPtr error = accept(options, file, signals, accepted);
+      if (error != nullptr) scan.failed.push_back({file, std::move(error)});
+    } catch (const CommandError& refusal) {
+      if (!options.unasked) throw;
+      scan.failed.push_back(AcceptedPlugins::refusedPlugin(file, refusal));
+    }
     scan.interrupted = signals.requestsToEnd() > 0;
     if (scan.interrupted) return scan;
-    if (error != nullptr) {
-      scan.failed.push_back({file, std::move(error)});
-      continue;
-    }
-    addRegistrations(file, loading.registrations(), lab);
-    loaded.push_back({file, lab.registrations().size()});
   }
-  if (scan.failed.empty()) checkDiagnostics(lab, loaded);
-  std::vector<Diagnostic> catalogue = catalogueOf(lab);
-  for (Diagnostic& one : catalogue) one.plugins = pluginsOf(one, lab, loaded);
+  if (scan.failed.empty() && options.unasked) {
+    scan.failed = accepted.removeIncomplete();
+  } else if (scan.failed.empty()) {
+    checkDiagnostics(accepted.lab(), accepted.loaded());
+  }
+  std::vector<Diagnostic> catalogue = catalogueOf(accepted.lab());
+  for (Diagnostic& one : catalogue) one.plugins = pluginsOf(one, accepted.lab(), accepted.loaded());
   const std::vector<Diagnostic> wanted = described(catalogue);
   DiagnosticDescription none;
   none.isAsked = false;

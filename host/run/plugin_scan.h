@@ -12,7 +12,7 @@
 
 namespace quazor {
 
-// A plug-in that could not be loaded: loading it ended its process, or there was no process.
+// A plug-in that could not be loaded: loading it ended its process, there was no process, or it was refused.
 struct FailedPlugin {
   std::filesystem::path file;
   DiagnosticErrorPtr error;
@@ -35,8 +35,9 @@ using DiagnosticChoice = std::function<std::vector<Diagnostic>(const std::vector
 // their descriptions. What one plug-in does has no effect on another: one that cannot be loaded is listed in `failed`,
 // and a diagnostic that needs a part of it is left out.
 //
-// Throws the CommandErrors of `described`, and kCannotRead if a file is no plug-in of this contract, registers nothing
-// or a name that is already taken, or if a diagnostic names a part that no plug-in registers although all were loaded.
+// Throws the CommandErrors of `described`. A plug-in is refused if others may change it, if it is no plug-in of this
+// contract, registers nothing or a name that is already taken, or if a diagnostic names a part that no plug-in
+// registers although all were loaded: throws a CommandError (kCannotRead), or lists it in `failed` if options.unasked.
 PluginScan scanPlugins(const IsolationOptions& options, WatchedSignals& signals, const DiagnosticChoice& described);
 
 // Asks the diagnostics of the catalogue that `wanted` contains for their descriptions. Those that need the same

@@ -2,10 +2,12 @@
 
 #include "host/error/exit_code.h"
 
+#include <poll.h>
 #include <sys/eventfd.h>
 #include <sys/prctl.h>
 #include <unistd.h>
 
+#include <algorithm>
 #include <atomic>
 #include <cerrno>
 #include <cstdint>
@@ -20,6 +22,8 @@ constexpr std::int64_t kSecond = 1'000'000'000;
 // How long an output may block after the second request, and how often that is checked.
 constexpr std::int64_t kMaxBlocked = 2 * kSecond;
 constexpr std::int64_t kCheckPeriod = kSecond / 10;
+// In milliseconds: a longer wait takes several calls.
+constexpr std::int64_t kLongestPoll = 60'000;
 // A process that has used less processor time between two checks has been waiting.
 constexpr std::int64_t kWorking = kSecond / 1000;
 
@@ -134,6 +138,18 @@ void WatchedSignals::drain() const {
 }
 
 int WatchedSignals::requestsToEnd() const { return requests; }
+
+void WatchedSignals::wait(std::chrono::nanoseconds time) const {
+  using SteadyClock = std::chrono::steady_clock;
+  const SteadyClock::time_point end = SteadyClock::now() + time;
+  while (requestsToEnd() == 0) {
+    const auto left = std::chrono::ceil<std::chrono::milliseconds>(end - SteadyClock::now());
+    if (left.count() <= 0) return;
+    pollfd watched{descriptor_, POLLIN, 0};
+    ::poll(&watched, 1, static_cast<int>(std::min<std::int64_t>(left.count(), kLongestPoll)));
+    drain();
+  }
+}
 
 void WatchedSignals::restore() const {
   for (const Replaced& one : replaced_) ::sigaction(one.signal, &one.before, nullptr);

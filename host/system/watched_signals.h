@@ -1,6 +1,7 @@
 // WatchedSignals: the signals that ask this process to end, while it supervises children.
 #pragma once
 
+#include <chrono>
 #include <vector>
 
 #include <signal.h>
@@ -31,6 +32,8 @@ class WatchedSignals {
   int descriptor() const { return descriptor_; }
   void drain() const;
   int requestsToEnd() const;
+  // Waits that long, or until there is a request to end.
+  void wait(std::chrono::nanoseconds time) const;
   // Restores the original signal handling, in a new child.
   void restore() const;
 

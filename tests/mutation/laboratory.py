@@ -95,7 +95,7 @@ class Laboratory:
     def test(self, pattern, each, limit):
         """Runs the tests that match, up to the first failure. Returns whether all passed, and the output."""
         command = ["ctest", "--test-dir", str(self.build), f"-j{self.jobs}", "--output-on-failure", "--stop-on-failure",
-                   "--no-tests=error", f"--timeout={each}", "-E", f"^({NOT_JUDGES})$"]
+                   "--no-tests=error", "--timeout", str(each), "-E", f"^({NOT_JUDGES})$"]
         shutil.rmtree(self.scratch, ignore_errors=True)
         self.scratch.mkdir(parents=True)
         return self._run([*self.confine, *command, *(["-R", pattern] if pattern else [])], limit)

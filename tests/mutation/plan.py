@@ -42,6 +42,12 @@ FOLDERS = (
 )
 
 
+def nearest(folder, file):
+    """Those of the folder's own tests that are named after the folder that the file is in."""
+    place = pathlib.PurePosixPath(file).parent.name
+    return tuple(name for name in folder.own if name in (f"{place}_test", f"linux_{place}_test"))
+
+
 def is_product(path):
     return path.suffix in (".h", ".cpp") and not path.stem.endswith(TEST_ENDINGS)
 

@@ -218,19 +218,42 @@ class OutputTest(unittest.TestCase):
         self.assertEqual(run.FAILED_TEST.findall(summary), [("one_test", "Failed"), ("two_test", "Timeout")])
 
 
+class LaboratoryTest(unittest.TestCase):
+    def test_a_test_that_exceeds_its_time_is_ended(self):
+        with tempfile.TemporaryDirectory() as folder:
+            work = pathlib.Path(folder)
+            one = laboratory.Laboratory(work, work, 1, [])
+            one.build.mkdir(parents=True)
+            (one.build / "CTestTestfile.cmake").write_text("add_test(hangs sleep 100)\n", encoding="utf-8")
+            passed, output = one.test("hangs", 1, 60)
+            self.assertFalse(passed)
+            self.assertEqual(run.FAILED_TEST.findall(output), [("hangs", "Timeout")])
+
+
 class JudgeTest(unittest.TestCase):
     FOLDER = plan.Folder("x", (), ("a_test",), ("b_test", "script_test"))
     MUTANT = Mutant("a.cpp", "constant", 0, 1, "2", "1", "2")
 
-    def judge(self, fake, first=0, count=run.STEPS):
+    def judge(self, fake, first=0, count=run.STEPS, folder=FOLDER, mutant=MUTANT):
         tests, targets = {"a_test", "b_test", "script_test"}, {"a_test", "b_test"}
-        return run.Judge(fake, tests, targets).judge(self.FOLDER, self.MUTANT, first, count)
+        return run.Judge(fake, tests, targets).judge(folder, mutant, first, count)
 
     def test_a_survivor_passes_every_step(self):
         fake = FakeLaboratory()
         self.assertEqual(self.judge(fake), ("survived", ""))
         self.assertEqual(fake.steps, [("make", ("a_test",)), ("test", "^(a_test)$"), ("make", ()),
                                             ("test", "^(b_test|script_test)$"), ("make", ()), ("test", "")])
+
+    def test_the_test_of_the_files_folder_judges_first(self):
+        folder = plan.Folder("x", (), ("a_test", "b_test"), ("script_test",))
+        mutant = Mutant("x/b/some.cpp", "constant", 0, 1, "2", "1", "2")
+        fake = FakeLaboratory()
+        self.assertEqual(self.judge(fake, 0, 1, folder, mutant), ("killed", "b_test (Failed)"))
+        self.assertEqual(fake.steps[:2], [("make", ("b_test",)), ("test", "^(b_test)$")])
+        fake = FakeLaboratory(times=0)
+        self.assertEqual(self.judge(fake, 0, 1, folder, mutant), (run.OPEN, ""))
+        self.assertEqual(fake.steps, [("make", ("b_test",)), ("test", "^(b_test)$"), ("make", ("a_test",)),
+                                      ("test", "^(a_test)$")])
 
     def test_the_first_failure_kills(self):
         fake = FakeLaboratory(failing="^(a_test)$")
@@ -256,6 +279,16 @@ class JudgeTest(unittest.TestCase):
             (False, "") if pattern == "^(b_test)$" and not fake.is_mutated else idle(pattern, each, limit))
         with self.assertRaises(run.BaselineError):
             self.judge(fake)
+
+    def test_nobody_waits_twice_for_a_timeout(self):
+        fake = FakeLaboratory(failing="^(a_test)$", reason="Timeout")
+        self.judge(fake, 0, 1)
+        self.assertEqual(fake.steps, [("make", ("a_test",)), ("test", "^(a_test)$")])
+
+    def test_a_step_that_exceeds_its_time_kills_unless_the_machine_is_busy(self):
+        fake = FakeLaboratory()
+        fake.test = lambda pattern, each, limit: (not fake.is_mutated and pattern == "^(a_test)$", "no summary")
+        self.assertEqual(self.judge(fake), ("killed", "all tests (Timeout)"))
 
     def test_some_of_the_steps_do_not_decide_about_a_survivor(self):
         self.assertEqual(self.judge(FakeLaboratory(), 0, 1), (run.OPEN, ""))

@@ -2,16 +2,17 @@
 """Changes the product by small mistakes and counts those that no test notices.
 
 usage: tests/mutation/run.py [--count N] [--seed S] [--jobs J] [--minutes M] [--folder NAME]... [--own]
-                             [--retry] [--list] [--work FOLDER]
+                             [--retry] [--list] [--work FOLDER] [--copy NAME]
 
 Draws N mutants (default 400) of the folders in plan.py, each folder at least its share, and builds and tests each in a
 copy of the tree below FOLDER (default build/mutation). A mutant is killed when a test fails or exceeds its time. It is
 tested by the folder's own tests first, then by those near it, then by the rest of the suite. One that does not compile
 is replaced by the next. equivalent.txt lists mutants that change nothing, with the reason.
 
-Every outcome is a line of FOLDER/outcomes.jsonl, so the next call goes on; --minutes ends this one early, --own leaves the
-tests of other folders to a later call, --retry tests the survivors again, --list only shows the outcomes so far. Exit code 0: at least 97 % are killed, and 95 % of each
-folder; 1: fewer; 2: not all are tested yet; 3: the tests fail without a mutant.
+Every outcome is a line of FOLDER/outcomes.jsonl, so the next call goes on; --minutes ends this one early, --own leaves
+the tests of other folders to a later call, --retry tests the survivors again, --list only shows the outcomes so far.
+Calls for different folders may run at the same time if each has a copy of the tree of its own (--copy). Exit code 0: at
+least 97 % are killed, and 95 % of each folder; 1: fewer; 2: not all are tested yet; 3: the tests fail without a mutant.
 """
 
 import argparse
@@ -32,8 +33,9 @@ COUNT, SEED = 400, 20261122
 STEPS = 3  # a folder's own tests, those near it, the rest
 LEAST, LEAST_OF_FOLDER = 0.97, 0.95
 OWN_LIMIT, REST_LIMIT = 600, 3000  # seconds for the tests of one step
-EACH_LIMIT = 300  # seconds for one test
+OWN_EACH_LIMIT, REST_EACH_LIMIT = 120, 300  # seconds for one test
 ATTEMPTS = 3
+ALL_TESTS = "all tests"  # when the step exceeds its time, but none of its tests does
 BATCH = 10  # of one folder in a row, because a header that changes back is compiled everywhere
 OPEN = "passed its folder's tests"  # with --own: a later call continues
 FAILED_TEST = re.compile(r"^\s*\d+ - (\S+) \((.*)\)$", re.MULTILINE)
@@ -66,9 +68,11 @@ class BaselineError(Exception):
 
 @dataclasses.dataclass(frozen=True)
 class Step:
-    targets: tuple
+    """Tests that judge together."""
+    targets: tuple  # empty: all
     pattern: str
-    limit: int
+    each: int  # seconds for one test
+    limit: int  # seconds for all
 
 
 class Judge:
@@ -80,25 +84,39 @@ class Judge:
         self.targets = targets
         self.sound = set()  # the steps that pass without a mutant
 
-    def _steps(self, folder):
-        """The steps of a judgement: targets to build (none: all), pattern of tests, limit."""
-        for names in (folder.own, folder.near):
-            known = [name for name in names if name in self.tests]
-            programs = [name for name in known if name in self.targets]
-            yield Step(tuple(programs) if len(programs) == len(known) else (), f"^({'|'.join(known)})$", OWN_LIMIT)
-        yield Step((), "", REST_LIMIT)
+    def _step(self, names, each):
+        known = [name for name in names if name in self.tests]
+        programs = [name for name in known if name in self.targets]
+        return Step(tuple(programs) if len(programs) == len(known) else (), f"^({'|'.join(known)})$", each, OWN_LIMIT)
+
+    def _steps(self, folder, mutant):
+        """The steps of a judgement, each in parts: the first failure ends it, so what fails most often comes first."""
+        nearest = plan.nearest(folder, mutant.file)
+        own = [names for names in (nearest, [name for name in folder.own if name not in nearest]) if names]
+        return ([self._step(names, OWN_EACH_LIMIT) for names in own], [self._step(folder.near, REST_EACH_LIMIT)],
+                [Step((), "", REST_EACH_LIMIT, REST_LIMIT)])
+
+    @staticmethod
+    def _pattern_of(names):
+        return f"^({'|'.join(re.escape(name) for name in names)})$"
 
     def _failures(self, step):
-        """The tests that fail twice, as pairs of name and reason: once may be a matter of time on a busy machine."""
+        """The tests that fail twice, as pairs of name and reason: once may be a matter of time on a busy machine.
+
+        Nobody waits twice for a test that exceeds its time: whether the machine is busy shows without the mutant.
+        """
         for _ in range(ATTEMPTS):
-            passed, output = self.laboratory.test(step.pattern, EACH_LIMIT, step.limit)
+            passed, output = self.laboratory.test(step.pattern, step.each, step.limit)
             if passed:
                 return []
-            names = [name for name, _ in FAILED_TEST.findall(output)]
-            again = f"^({'|'.join(re.escape(name) for name in names)})$" if names else step.pattern
-            passed, output = self.laboratory.test(again, EACH_LIMIT, step.limit)
+            failed = FAILED_TEST.findall(output)
+            if any(why == "Timeout" for _, why in failed):
+                return failed
+            names = [name for name, _ in failed]
+            again = self._pattern_of(names) if names else step.pattern
+            passed, output = self.laboratory.test(again, step.each, step.limit)
             if not passed:
-                return FAILED_TEST.findall(output) or [("all tests", "Timeout")]
+                return FAILED_TEST.findall(output) or [(ALL_TESTS, "Timeout")]
         raise BaselineError(f"fails only now and then: {', '.join(names)}")
 
     def _require_baseline(self, step, again=False):
@@ -106,25 +124,25 @@ class Judge:
         if step in self.sound and not again:
             return
         built, output = self.laboratory.make(step.targets)
-        passed, output = self.laboratory.test(step.pattern, EACH_LIMIT, step.limit) if built else (False, output)
+        passed, output = self.laboratory.test(step.pattern, step.each, step.limit) if built else (False, output)
         if not passed:
             raise BaselineError(output[-3000:])
         self.sound.add(step)
 
     def judge(self, folder, mutant, first, count):
         """The outcome after `count` steps from the first one on, and what killed the mutant."""
-        steps = list(self._steps(folder))
-        for number in range(first, min(first + count, len(steps))):
-            step = steps[number]
+        steps = self._steps(folder, mutant)
+        for step in (part for parts in steps[first:first + count] for part in parts):
             self._require_baseline(step)
             with self.laboratory.mutated(mutant):
                 built, _ = self.laboratory.make(step.targets)
                 if not built:
-                    return ("does not compile", "") if number == 0 else ("killed", "the build")
+                    return ("does not compile", "") if step in steps[0] else ("killed", "the build")
                 failed = self._failures(step)
             if any(why == "Timeout" for _, why in failed):  # unless the machine is busy
-                names = "|".join(re.escape(name) for name, _ in failed)
-                self._require_baseline(dataclasses.replace(step, pattern=f"^({names})$"), again=True)
+                names = [name for name, _ in failed if name != ALL_TESTS]
+                pattern = self._pattern_of(names) if names else step.pattern
+                self._require_baseline(dataclasses.replace(step, pattern=pattern), again=True)
             if failed:
                 return "killed", ", ".join(f"{name} ({why})" for name, why in failed)
         return ("survived" if first + count >= len(steps) else OPEN), ""
@@ -215,7 +233,9 @@ def parse(arguments):
     parser.add_argument("--own", action="store_true", help="run only each folder's own tests; a later call continues")
     parser.add_argument("--retry", action="store_true", help="test the survivors again")
     parser.add_argument("--list", action="store_true", help="show the outcomes so far")
-    parser.add_argument("--work", type=pathlib.Path, default=plan.root_of_tree() / "build" / "mutation")
+    parser.add_argument("--work", type=pathlib.Path, default=plan.root_of_tree() / "build" / "mutation",
+                        help="where the outcomes and the copies of the tree are; default build/mutation")
+    parser.add_argument("--copy", default="", help="the name of another copy of the tree, for a second call")
     return parser.parse_args(arguments)
 
 
@@ -244,7 +264,7 @@ def main(arguments):
     confine = namespace_command()
     if confine is None:
         sys.exit("a mutant could signal other processes, and unshare(1) cannot create a namespace to confine it")
-    laboratory = Laboratory(root, work, options.jobs, confine)
+    laboratory = Laboratory(root, work / options.copy, options.jobs, confine)
     laboratory.update()
     laboratory.configure()
     judge = Judge(laboratory, laboratory.known_tests(), laboratory.targets())

@@ -85,7 +85,7 @@ for name, below in {
     "record": ["error", "limits", "model", "system", "text"],
     "report": ["device", "error", "limits", "model", "plugin", "record", "system", "text"],
     "run": ["device", "error", "limits", "model", "plugin", "record", "report", "system", "text"],
-    "cli": ["device", "error", "limits", "plugin", "report", "run", "text"],
+    "cli": ["device", "error", "limits", "plugin", "report", "run", "system", "text"],
     "command": ["cli", "device", "error", "limits", "model", "plugin", "record", "report", "run", "system", "text"],
 }.items():
     ALLOWED["host/" + name] = [*CONTRACT, "base/json", "base/text", *("host/" + folder for folder in below)]

@@ -30,6 +30,8 @@ TEST(FrameCountsTest, GapsAreTheNumbersThatAreMissing) {
       {"what came before the first is not known", {7, 8}, 0},
       {"numbers wrap around", {4294967295U, 0, 1}, 0},
       {"a gap where they wrap around", {4294967294U, 1}, 2},
+      {"the longest gap", {0, 2147483647U}, 2147483646U},
+      {"one number more is a number that goes back", {0, 2147483648U}, 0},
   };
   for (const auto& row : rows) EXPECT_EQ(counted(row.sequences).sequenceGaps, row.gaps) << row.name;
 }

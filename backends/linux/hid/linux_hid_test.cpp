@@ -215,6 +215,9 @@ TEST_F(LinuxHidTest, AFeatureReportThatFailsSaysWhy) {
        "LinuxErrorDomain code 1: HIDIOCSFEATURE of report 171 on /dev/hidraw0 failed: Input/output error (EIO)"},
       {"refused late", EIO, 4499ms,
        "LinuxErrorDomain code 1: HIDIOCSFEATURE of report 171 on /dev/hidraw0 failed: Input/output error (EIO)"},
+      {"without an answer in time", EIO, 4500ms,
+       "LinuxErrorDomain code 11: HIDIOCSFEATURE of report 171 on /dev/hidraw0 failed: the device did not respond for "
+       "4500 ms."},
       {"without an answer", EIO, 5120ms,
        "LinuxErrorDomain code 11: HIDIOCSFEATURE of report 171 on /dev/hidraw0 failed: the device did not respond for "
        "5120 ms."},

@@ -111,7 +111,9 @@ TEST(ProjectorGuardTest, SetsTheValuesWhenItsProcessIsKilledAndEndsItself) {
   const Device device;
   const pid_t guard = processThatEnds(device, [] { ::raise(SIGKILL); });
   EXPECT_EQ(device.contentOnceIs("a5 b0 "), "a5 b0 ");
-  EXPECT_EQ(::waitpid(guard, nullptr, 0), guard) << "it came to this process and ended";
+  int status = -1;
+  EXPECT_EQ(::waitpid(guard, &status, 0), guard) << "it came to this process and ended";
+  EXPECT_EQ(status, 0) << "by itself";
 }
 
 TEST(ProjectorGuardTest, SetsTheValuesWhenItsProcessExitsWithoutDestroyingIt) {
@@ -183,6 +185,15 @@ TEST(ProjectorGuardTest, WhoKilledItDoesNotEndTheProcessThatLetsGoOfIt) {
   std::this_thread::sleep_for(3ms);
   guard.reset();
   EXPECT_EQ(device.content(), "");
+}
+
+TEST(ProjectorGuardTest, AProcessThatIgnoresTheEndsOfItsChildrenCanLetGoOfIt) {
+  const Device device;
+  std::unique_ptr<ControlGuard> guard = guardOf(device);
+  const auto before = ::signal(SIGCHLD, SIG_IGN);
+  guard.reset();
+  ::signal(SIGCHLD, before);
+  EXPECT_EQ(device.content(), "a5 b0 ");
 }
 
 TEST(ProjectorGuardTest, ACopyOfItsProcessDoesNotKeepItAlive) {
