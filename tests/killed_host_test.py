@@ -73,7 +73,7 @@ class Killed:
     def __init__(self, directory, wait, names=NAMES, settings=("--set", f"count={COUNT}")):
         self.record = directory / "record.jsonl"
         environment = environment_with_marker(XDG_STATE_HOME=str(directory), MISBEHAVIOUR_STATE=str(directory / "state"))
-        command = [PROGRAM, "run", *names, "--record", str(self.record), "--log-level", "debug",
+        command = [PROGRAM, "run", *names, "--verbose", "--record", str(self.record), "--log-level", "debug",
                    *settings]
         for plugin in ("misbehaving", "well_behaved"):
             command += ["--plugin", str(PLUGINS / f"{plugin}.so")]

@@ -325,7 +325,7 @@ bool writeSamples(const std::filesystem::path& directory, std::size_t count, std
   for (std::size_t i = 0; i < count; ++i) {
     const auto [run, records, interrupted] = generator.sample();
     for (std::size_t at = 0; at < files.size(); ++at) {
-      const std::string report = reportText(kFormats[at], run, records, interrupted);
+      const std::string report = reportText(kFormats[at], run, records, interrupted, {true, {}});
       files[at] << report.size() << '\n' << report;
     }
   }

@@ -43,10 +43,24 @@ def counts_line(records, of_experiments):
             f"{count['error']} ended in an error")
 
 
+def failure_line(record):
+    """The line at the end of a text that says what did not pass."""
+    if record["errors"]:
+        what = f"{record['errors'][0].domain} code {record['errors'][0].code}"
+    else:
+        names = list(dict.fromkeys(one.name for one in record["results"] if one.verdict == "fail"))
+        what = ", ".join(names[:3]) + (f" and {len(names) - 3} more" if len(names) > 3 else "")
+    word = {"fail": "FAIL ", "error": "ERROR"}[record["verdict"]]
+    name = report_readers.printable(record["name"])
+    return f"{word} {name}: {report_readers.printable(what)}" if what else f"{word} {name}"
+
+
 def text_end(records, of_experiments, interrupted):
     """The lines after the records of a text."""
     if len(records) != 1 or interrupted is not None:
         yield counts_line(records, of_experiments)
+    if not of_experiments:
+        yield from (failure_line(one) for one in records if one["verdict"] != "pass")
     if interrupted:
         yield f"Interrupted while {report_readers.printable(interrupted)} was running."
 

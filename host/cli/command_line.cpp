@@ -47,6 +47,7 @@ struct RawOptions {
   bool realTime = false;
   bool systemLog = false;
   bool inProcess = false;
+  bool verbose = false;
 };
 
 void addRepeatable(CLI::App& command, const std::string& name, std::vector<std::string>& texts,
@@ -154,6 +155,11 @@ void addTags(CLI::App& command, RawOptions& raw) {
       "Keep this in the record and the reports, for example serial=C02X; repeatable. The environment variable "
       "QUAZOR_TAGS holds tags in the same form, separated by spaces",
       "KEY=VALUE");
+}
+
+void addVerbose(CLI::App& command, RawOptions& raw) {
+  command.add_flag("--verbose", raw.verbose,
+                   "Show every result in text reports, not only those that fail, warn or have a limit of your own");
 }
 
 void addLimits(CLI::App& command, RawOptions& raw) {
@@ -299,6 +305,7 @@ Options optionsOf(const CLI::App& command, const RawOptions& raw) {
   const bool isOfRun = options.command == Command::kRun || options.command == Command::kExperiment ||
                        options.command == Command::kAnalyze;
   options.report = reportOf(raw, isOfRun);
+  options.report.text.verbose = raw.verbose;
   options.report.shownLog = options.logLevel.value_or(LogLevel::kError);
   options.withoutProfile = raw.profile == "none";
   if (!options.withoutProfile) options.profile = raw.profile;
@@ -363,8 +370,10 @@ void declareRunningCommands(CLI::App& app, RawOptions& raw) {
     addProcessOptions(*command, raw);
     addTags(*command, raw);
   }
-  addLimits(run, raw);
-  addLimits(analyze, raw);
+  for (CLI::App* const command : {&run, &analyze}) {
+    addLimits(*command, raw);
+    addVerbose(*command, raw);
+  }
 }
 
 void declareOtherCommands(CLI::App& app, RawOptions& raw) {
@@ -400,6 +409,11 @@ void declareOtherCommands(CLI::App& app, RawOptions& raw) {
       ->type_name("")
       ->required()
       ->check(CLI::IsMember({"bash", "zsh"}));
+  CLI::App& project = *app.add_subcommand("new", "Make the project of a plug-in, with a diagnostic, phones and a test");
+  project.add_option("FOLDER", raw.names, "Where to make it; its last part is the plug-in's name")
+      ->type_name("")
+      ->required()
+      ->expected(1);
 }
 
 void declareCommands(CLI::App& app, RawOptions& raw) {

@@ -34,17 +34,19 @@ enum class Command {
   kDoctor,
   kSelftest,
   kPhone,
-  kCompletion
+  kCompletion,
+  kNew
 };
 
 // In the order of the enumerators.
-inline constexpr std::string_view kCommandNames[] = {"list",   "describe", "run",   "experiment",
-                                                     "verify", "analyze",  "diff",  "explain",
-                                                     "doctor", "selftest", "phone", "completion"};
+inline constexpr std::string_view kCommandNames[] = {"list",    "describe",   "run",     "experiment", "verify",
+                                                     "analyze", "diff",       "explain", "doctor",     "selftest",
+                                                     "phone",   "completion", "new"};
 
 // A parsed command line. Options that the command does not have keep their defaults.
 struct Options {
-  std::vector<std::string> names;  // positional arguments: diagnostics or experiments, topics, a shell, "probe"
+  std::vector<std::string>
+      names;  // positional arguments: diagnostics or experiments, topics, a shell, "probe", a folder
   std::vector<std::filesystem::path> plugins;  // empty: those in the folders of plug-ins
   std::vector<ParameterOverride> settings;
   std::vector<UserLimit> limits;

@@ -182,6 +182,7 @@ TEST(ParseCommandLine, KnowsItsCommands) {
                       {{"explain", "206"}, Command::kExplain},
                       {{"doctor"}, Command::kDoctor},
                       {{"selftest"}, Command::kSelftest},
+                      {{"new", "folder"}, Command::kNew},
                       {{"phone", "probe"}, Command::kPhone},
                       {{"completion", "bash"}, Command::kCompletion}};
   EXPECT_EQ(std::size(rows), std::size(kCommandNames));

@@ -34,6 +34,7 @@ constexpr Example kExamples[] = {
     {"quazor explain QZCapturePlugInErrorDomain:206", "what an error means, and what to do next"},
     {"quazor doctor", "check the installation"},
     {"quazor selftest", "check that the diagnostics detect simulated faults"},
+    {"quazor new my_plugin", "make the project of a plug-in of your own"},
     {"quazor completion bash > ~/.local/share/bash-completion/completions/quazor"},
 };
 
@@ -46,14 +47,14 @@ struct ExitCodeHelp {
 constexpr ExitCodeHelp kExitCodes[] = {
     {0, "all diagnostics passed, or all experiments returned a result", "run experiment analyze"},
     {0, "no problem was found", "verify diff doctor selftest"},
-    {0, "done", "list describe explain phone completion"},
+    {0, "done", "list describe explain phone completion new"},
     {1, "a result was outside its limits", "run analyze"},
     {1, "a problem was found", "verify diff selftest"},
     {2, "a diagnostic or experiment ended in an error", "run experiment analyze describe"},
     {3, "a record is incomplete, because its run did not end", "verify"},
     {64, "the command line is invalid", {}},
     {66, "a plug-in, scenario, binding, profile or record cannot be read or loaded",
-     "list describe run experiment verify analyze diff explain doctor selftest"},
+     "list describe run experiment verify analyze diff explain doctor selftest new"},
     {70, "quazor itself failed", {}},
     {73, "a report or record cannot be written", {}},
     {130, "interrupted", "list describe run experiment analyze doctor selftest"},

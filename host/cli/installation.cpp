@@ -130,6 +130,8 @@ fs::path Installation::plugin(const fs::path& name) const {
                                                 (list.empty() ? "none" : list));
 }
 
+fs::path Installation::pluginTemplate() const { return data_ / "plugin_template"; }
+
 fs::path Installation::defaultProfile() const { return data_ / "profiles" / "default.json"; }
 
 fs::path Installation::profile(const fs::path& name) const { return dataFile("profiles", name); }

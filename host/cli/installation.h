@@ -45,6 +45,8 @@ class Installation {
   // the folders above. Throws a CommandError (kCannotRead), which lists what there is, if there is none; and like
   // allPlugins().
   std::filesystem::path plugin(const std::filesystem::path& name) const;
+  // The folder of the project that `quazor new` copies.
+  std::filesystem::path pluginTemplate() const;
   std::filesystem::path defaultProfile() const;
   // Resolves the argument of `--profile` like scenario(), among the profiles.
   std::filesystem::path profile(const std::filesystem::path& name) const;

@@ -262,7 +262,7 @@ class RunTest(CommandLineTest):
             self.assertIn("2 diagnostics: 0 passed, 1 failed, 1 ended in an error", result.stdout)
 
     def test_a_table_a_verdict_and_a_summary(self):
-        result = self.run_fake("--set", "measured=90", "--set", "minimum=90", names=["Fake.*"])
+        result = self.run_fake("--set", "measured=90", "--set", "minimum=90", "--verbose", names=["Fake.*"])
         self.assertEqual(result.returncode, 0)
         self.assertRegex(result.stdout, r"Count +90  frames  Enough: >= 90  pass\n")
         self.assertIn("\n  PASS\n", result.stdout)
@@ -270,7 +270,7 @@ class RunTest(CommandLineTest):
 
     def test_the_chain_of_errors_is_shown(self):
         result = self.run_fake("--set", "experiment.behaviour=5")
-        self.assertIn("  ERROR\n    FakeDomain code 2: run failed\n", result.stdout)
+        self.assertIn("\n\n  FakeDomain code 2: run failed\n  caused by ", result.stdout)
 
     def test_a_failure_without_an_error_says_so(self):
         result = self.run_fake("--set", "experiment.behaviour=6")

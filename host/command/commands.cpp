@@ -103,6 +103,7 @@ ExitCode perform(const Options& options, const Installation& installation, Conso
     case Command::kDoctor: return doctorCommand(options, installation, console);
     case Command::kSelftest: return selftestCommand(options, installation, console, watchSignals(options));
     case Command::kPhone: return phoneCommand(options, console);
+    case Command::kNew: return newCommand(options, installation, console);
     case Command::kCompletion: break;
   }
   console.out << completionScript(options.names.front()) << std::flush;

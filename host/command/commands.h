@@ -38,9 +38,9 @@ ExitCode diffCommand(const Options& options, Console& console);
 // kAllPassed if nothing is refused, else kCannotRead.
 ExitCode doctorCommand(const Options& options, const Installation& installation, Console& console);
 
-// selftest: runs the expected outcomes of every installed phone, or of the phones named in the options, with the
-// requested number of seeds. kAllPassed if every outcome is as expected, else kFailed. Throws a CommandError if a file
-// cannot be read, and kInterrupted on an interrupt. `signals` is null with --in-process.
+// selftest: runs the expected outcomes of every installed phone, or of the phones and files named in the options, with
+// the requested number of seeds. kAllPassed if every outcome is as expected, else kFailed. Throws a CommandError if a
+// file cannot be read, and kInterrupted on an interrupt. `signals` is null with --in-process.
 ExitCode selftestCommand(const Options& options, const Installation& installation, Console& console,
                          WatchedSignals* signals);
 
@@ -48,6 +48,11 @@ ExitCode selftestCommand(const Options& options, const Installation& installatio
 // which goes to the output file if there is one. Missing devices are not a failure: kAllPassed. Throws a CommandError
 // (kCannotWrite) if the file cannot be written.
 ExitCode phoneCommand(const Options& options, Console& console);
+
+// new: makes a folder with the project of a plug-in, which is the installed template with the names of the new one.
+// Throws a CommandError, and then leaves nothing behind: kUsage for a name that no plug-in can have, kCannotRead
+// without the template, kCannotWrite if the folder exists and is not empty, or cannot be made.
+ExitCode newCommand(const Options& options, const Installation& installation, Console& console);
 
 // Writes the output of a command that does not run a diagnostic to the output file, or else to the console. Throws a
 // CommandError (kCannotWrite) on failure.

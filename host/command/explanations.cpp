@@ -264,4 +264,20 @@ std::vector<const Explanation*> findExplanations(const std::vector<Explanation>&
   return found;
 }
 
+std::function<bool(const std::string& topic)> explainedTopics(std::vector<std::filesystem::path> directories) {
+  return [directories = std::move(directories),
+          all = std::optional<std::vector<Explanation>>()](const std::string& topic) mutable {
+    if (!all) {
+      try {
+        all = readExplanations(directories);
+      } catch (const InputError&) {
+        all.emplace();
+      }
+    }
+    return std::ranges::any_of(*all, [&topic](const Explanation& one) {
+      return one.isError() ? keyOf(one.domain, one.code) == topic : holds(one.names, topic);
+    });
+  };
+}
+
 }  // namespace quazor

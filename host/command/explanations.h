@@ -4,6 +4,7 @@
 
 #include <cstdint>
 #include <filesystem>
+#include <functional>
 #include <string>
 #include <string_view>
 #include <vector>
@@ -54,5 +55,9 @@ std::vector<Explanation> readExplanations(const std::vector<std::filesystem::pat
 // name, if it selects none.
 std::vector<const Explanation*> findExplanations(const std::vector<Explanation>& explanations,
                                                  const std::string& asked);
+
+// A function that tells whether an error, as DOMAIN:CODE, or a name has an explanation in the directories. They
+// are read at the first call; if they cannot be read, nothing has an explanation. Thread: one at a time.
+std::function<bool(const std::string& topic)> explainedTopics(std::vector<std::filesystem::path> directories);
 
 }  // namespace quazor

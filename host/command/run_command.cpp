@@ -1,6 +1,7 @@
 #include "host/command/commands.h"
 
 #include "contract/contract.h"
+#include "host/command/explanations.h"
 #include "host/command/failed_only.h"
 #include "host/command/output_check.h"
 #include "host/command/selection.h"
@@ -117,8 +118,10 @@ RunStarted beginningOf(const Options& options, const Installation& installation,
   return began;
 }
 
-EventPipelineOptions eventOptions(const Options& options, bool keepsLastRun) {
-  return {options.record, keepsLastRun, options.systemLog, options.report, options.logLimit};
+EventPipelineOptions eventOptions(const Options& options, const Installation& installation, bool keepsLastRun) {
+  ReportOptions report = options.report;
+  report.text.isExplained = explainedTopics(installation.explanations());
+  return {options.record, keepsLastRun, options.systemLog, std::move(report), options.logLimit};
 }
 
 // The time to wait between two diagnostics. Each gets a new phone, so the time of one that is simulated passes at once.
@@ -131,7 +134,7 @@ ExitCode perform(const Options& options, const Installation& installation, Conso
                  const std::vector<Job>& jobs, const std::vector<FailedPlugin>& failed, const RunOptions& runOptions,
                  WatchedSignals* signals) {
   checkOutputs(options, installation, began);
-  EventPipeline events(eventOptions(options, options.command == Command::kRun), console);
+  EventPipeline events(eventOptions(options, installation, options.command == Command::kRun), console);
   std::optional<InterruptWatcher> watcher;
   if (options.inProcess) {
     watcher.emplace([&events] { events.interruptAndLeave([] { ::_exit(static_cast<int>(ExitCode::kInterrupted)); }); });
@@ -171,7 +174,7 @@ ExitCode performNothing(const Options& options, const Installation& installation
   checkOutputs(options, installation, began);
   const bool isForPeople = options.report.format == Format::kText || !options.report.output.empty();
   (isForPeople ? console.out : console.err) << "Everything passed in the last run.\n" << std::flush;
-  EventPipeline events(eventOptions(options, false), console);
+  EventPipeline events(eventOptions(options, installation, false), console);
   events.onEvent(std::move(began));
   events.onEvent(RunEnded{std::nullopt, dateNow()});
   events.requireRecords();

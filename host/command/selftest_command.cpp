@@ -21,6 +21,10 @@ std::vector<std::string> wantedScenarios(const Options& options, const Installat
   if (options.names.empty()) return all;
   std::vector<std::string> wanted;
   for (const std::string& name : options.names) {
+    if (std::filesystem::is_regular_file(name)) {
+      wanted.push_back(name);
+      continue;
+    }
     const std::size_t before = wanted.size();
     for (const std::string& one : all) {
       if (matchesName(name, one) && std::find(wanted.begin(), wanted.end(), one) == wanted.end()) wanted.push_back(one);
@@ -87,8 +91,7 @@ class Selftest {
       const Diagnostic& diagnostic = one.diagnostic;
       if (diagnostic.name == expected.name && diagnostic.experimentOnly == expected.experimentOnly) return one;
     }
-    throw CommandError(ExitCode::kCannotRead,
-                       "an installed phone expects " + expected.name + ", but no loaded plug-in has it");
+    throw CommandError(ExitCode::kCannotRead, "a phone expects " + expected.name + ", but no loaded plug-in has it");
   }
 
   ResolvedParameters parametersOf(const DescribedDiagnostic& described, const ExpectedOutcome& expected) const {

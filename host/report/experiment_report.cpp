@@ -2,7 +2,6 @@
 
 #include "contract/message_format.h"
 #include "host/report/sample_images.h"
-#include "host/report/text_report.h"
 #include "host/text/sample_picture.h"
 #include "host/text/table.h"
 

@@ -3,17 +3,12 @@
 
 #include "contract/value.h"
 #include "host/model/diagnostic_record.h"
+#include "host/report/text_report.h"
 
 #include <ostream>
 #include <vector>
 
 namespace quazor {
-
-// The capabilities of the output.
-struct TextStyle {
-  bool colour = false;
-  bool blocks = false;  // supports UTF-8 and block elements
-};
 
 // Prints auxiliary data, indented by two spaces and within 80 columns unless a name or text is longer. For an image
 // (sample_images.h) it prints a line with the values other than samples, then a picture of each list of 8 to 64 samples

@@ -8,6 +8,7 @@
 #include "host/report/ocp_stream.h"
 #include "host/report/run_identity.h"
 #include "host/report/text_report.h"
+#include "host/text/shell_word.h"
 
 #include <algorithm>
 #include <iterator>
@@ -31,25 +32,10 @@ void addText(Json& json, const char* key, const std::string& text) {
   if (!text.empty()) json[key] = text;
 }
 
-// Quotes the text as one word of a shell command.
-std::string quoted(const std::string& text) {
-  constexpr std::string_view kPlain = "ABCDEFGHIJKLMNOPQRSTUVWXYZabcdefghijklmnopqrstuvwxyz0123456789_./:=,+-";
-  if (!text.empty() && text.find_first_not_of(kPlain) == std::string::npos) return text;
-  std::string word = "'";
-  for (const char unit : text) {
-    if (unit == '\'') {
-      word += R"('\'')";
-    } else {
-      word += unit;
-    }
-  }
-  return word + "'";
-}
-
 // Appends `before`, which includes blanks, and the quoted word.
 void addWord(std::string& line, std::string_view before, const std::string& word) {
   line += before;
-  line += quoted(word);
+  line += shellWord(word);
 }
 
 void addSettings(std::string& line, std::string_view part, const std::vector<ResolvedParameter>& parameters) {

@@ -9,9 +9,10 @@
 #include "host/report/junit_report.h"
 #include "host/report/ocp_report.h"
 #include "host/report/run_identity.h"
-#include "host/report/text_report.h"
+#include "host/report/short_report.h"
 #include "host/text/table.h"
 
+#include <algorithm>
 #include <sstream>
 
 namespace quazor {
@@ -19,10 +20,10 @@ namespace quazor {
 namespace {
 
 std::string textReport(const RunStarted& run, const std::vector<DiagnosticRecord>& records,
-                       const std::optional<std::string>& interrupted) {
+                       const std::optional<std::string>& interrupted, const TextContent& content) {
   std::ostringstream text;
-  for (const DiagnosticRecord& record : records) printReport(text, record, false, false);
-  if (records.size() != 1 || interrupted) printCounts(text, records, run.ofExperiments);
+  for (const DiagnosticRecord& record : records) printReport(text, run, record, {false, false, content.verbose});
+  printEnd(text, run, records, interrupted, content, false);
   if (interrupted && !interrupted->empty()) {
     text << "Interrupted while " << printable(*interrupted) << " was running.\n";
   }
@@ -63,9 +64,9 @@ OutputRequest parseOutput(const std::string& text, Format usual) {
 }
 
 std::string reportText(Format format, const RunStarted& run, const std::vector<DiagnosticRecord>& records,
-                       const std::optional<std::string>& interrupted) {
+                       const std::optional<std::string>& interrupted, const TextContent& text) {
   switch (format) {
-    case Format::kText: return textReport(run, records, interrupted);
+    case Format::kText: return textReport(run, records, interrupted, text);
     case Format::kCsv: return withRunColumns(run.ofExperiments ? experimentCsv(records) : diagnosticCsv(records), run);
     case Format::kOcp: return ocpReport(run, records, interrupted);
     case Format::kJunit: return junitReport(run, records, interrupted);
@@ -77,16 +78,24 @@ std::string reportText(Format format, const RunStarted& run, const std::vector<D
   return documentText(document);
 }
 
-void printReport(std::ostream& out, const DiagnosticRecord& record, bool colour, bool blocks) {
+void printReport(std::ostream& out, const RunStarted& run, const DiagnosticRecord& record, TextStyle style) {
   if (record.experimentOnly) {
-    printExperiment(out, record, {colour, blocks});
+    printExperiment(out, record, style);
+  } else if (style.verbose) {
+    printRecord(out, record, style.colour);
   } else {
-    printRecord(out, record, colour);
+    std::size_t nameWidth = 0;
+    for (const std::string& name : run.names) nameWidth = std::max(nameWidth, widthOf(printable(name)));
+    printShortRecord(out, record, style.colour, nameWidth);
   }
 }
 
-void printCounts(std::ostream& out, const std::vector<DiagnosticRecord>& records, bool ofExperiments) {
-  ofExperiments ? printExperimentSummary(out, records) : printSummary(out, records);
+void printEnd(std::ostream& out, const RunStarted& run, const std::vector<DiagnosticRecord>& records,
+              const std::optional<std::string>& interrupted, const TextContent& text, bool colour) {
+  if (records.size() != 1 || interrupted) {
+    run.ofExperiments ? printExperimentSummary(out, records) : printSummary(out, records);
+  }
+  if (!run.ofExperiments) printFailures(out, records, colour, text.isExplained);
 }
 
 }  // namespace quazor

@@ -2,8 +2,10 @@
 #pragma once
 
 #include "host/model/run_event.h"
+#include "host/report/text_report.h"
 
 #include <filesystem>
+#include <functional>
 #include <optional>
 #include <string>
 #include <string_view>
@@ -30,14 +32,23 @@ struct OutputRequest {
 // format.
 OutputRequest parseOutput(const std::string& text, Format usual);
 
-// The complete report of a run. `interrupted` as in RunEnded.
+// What the text reports of a run show.
+struct TextContent {
+  bool verbose = false;  // every result of a diagnostic
+  // True for what `quazor explain` explains; without the function, nothing is.
+  std::function<bool(const std::string& topic)> isExplained{};
+};
+
+// The complete report of a run. `interrupted` as in RunEnded. `text` only matters for kText.
 std::string reportText(Format format, const RunStarted& run, const std::vector<DiagnosticRecord>& records,
-                       const std::optional<std::string>& interrupted);
+                       const std::optional<std::string>& interrupted, const TextContent& text = {});
 
-// Prints the text report of one record.
-void printReport(std::ostream& out, const DiagnosticRecord& record, bool colour, bool blocks);
+// Prints the text report of one record of the run.
+void printReport(std::ostream& out, const RunStarted& run, const DiagnosticRecord& record, TextStyle style);
 
-// Prints one line with the number of records per verdict.
-void printCounts(std::ostream& out, const std::vector<DiagnosticRecord>& records, bool ofExperiments);
+// Prints the end of the text report: the number of records per verdict, unless there is only one and the run was not
+// interrupted, and what did not pass (short_report.h).
+void printEnd(std::ostream& out, const RunStarted& run, const std::vector<DiagnosticRecord>& records,
+              const std::optional<std::string>& interrupted, const TextContent& text, bool colour);
 
 }  // namespace quazor

@@ -77,8 +77,10 @@ class ReportTextTest : public testing::Test {
 
 TEST_F(ReportTextTest, HasEachRecordInEveryFormat) {
   EXPECT_THAT(report(Format::kText),
-              testing::AllOf(HasSubstr("  PASS\n"), HasSubstr("  FAIL\n"),
-                             EndsWith("2 diagnostics: 1 passed, 1 failed, 0 ended in an error\n")));
+              testing::AllOf(StartsWith("PASS  A  2 results"), HasSubstr("\nFAIL  B  2 results"),
+                             EndsWith("2 diagnostics: 1 passed, 1 failed, 0 ended in an error\nFAIL  B: Count\n")));
+  EXPECT_THAT(reportText(Format::kText, run_, records_, std::nullopt, {true, {}}),
+              testing::AllOf(HasSubstr("\n  PASS\n"), HasSubstr("\n  FAIL\n"), EndsWith("\nFAIL  B: Count\n")));
   EXPECT_EQ(report(Format::kJson), documentText(withRun(runDocument(records_, std::nullopt))));
   EXPECT_THAT(report(Format::kCsv), testing::AllOf(StartsWith("diagnostic,verdict,"), HasSubstr("\nB,fail,")));
   EXPECT_THAT(report(Format::kJunit), testing::AllOf(StartsWith("<?xml"), HasSubstr("<testsuite name=\"B\"")));

@@ -34,7 +34,7 @@ void RunReport::addRecord(DiagnosticRecord record) {
   if (!options_.output.empty()) {
     printVerdict(console_.out, record, console_.colour);
   } else if (options_.format == Format::kText) {
-    printReport(console_.out, record, console_.colour, console_.blocks);
+    printReport(console_.out, run_, record, {console_.colour, console_.blocks, options_.text.verbose});
   }
   console_.out.flush();
   // The CSV table of measurements has no column for errors.
@@ -49,8 +49,8 @@ void RunReport::finishRun(const RunEnded& event) {
   progress_.stop();
   const bool toFile = !options_.output.empty();
   const std::optional<std::string>& interrupted = event.interrupted;
-  if ((toFile || options_.format == Format::kText) && (records_.size() != 1 || interrupted)) {
-    printCounts(console_.out, records_, run_.ofExperiments);
+  if (toFile || options_.format == Format::kText) {
+    printEnd(console_.out, run_, records_, interrupted, options_.text, console_.colour);
   }
   if (!toFile && options_.format != Format::kText) {
     console_.out << reportText(options_.format, run_, records_, interrupted);
@@ -74,7 +74,7 @@ void RunReport::finishRun(const RunEnded& event) {
 
 void RunReport::writeFile(const OutputRequest& output, const std::optional<std::string>& interrupted) {
   try {
-    writeOutputFile(output.file, reportText(output.format, run_, records_, interrupted));
+    writeOutputFile(output.file, reportText(output.format, run_, records_, interrupted, options_.text));
   } catch (const CommandError& problem) {
     console_.err << "quazor: " << printable(problem.what()) << '\n';
     allWritten_ = false;

@@ -30,6 +30,7 @@ struct ReportOptions {
   std::filesystem::path output;
   std::vector<OutputRequest> outputs{};  // additional reports
   LogLevel shownLog = LogLevel::kError;  // lines up to this level go to the console's error stream
+  TextContent text{};
 };
 
 // The text report is printed after each diagnostic, all other formats at the end of the run. If the report goes to a

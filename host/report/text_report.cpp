@@ -66,21 +66,6 @@ void addResultRow(Table& table, const QZMeasuredResult& result, const std::strin
                std::string(before), std::string(before.empty() ? std::string_view() : kPlain));
 }
 
-void printResults(std::ostream& out, const DiagnosticRecord& record, bool colour) {
-  using Align = Table::Align;
-  Table table({Align::kLeft, Align::kRight, Align::kLeft, Align::kLeft, Align::kLeft});
-  table.addRow({"Result", "Value", "Unit", "Limit", "Verdict"});
-  const std::vector<LimitCheck> checks = limitChecksOf(record);
-  for (std::size_t i = 0; i < record.measuredResults.size(); ++i) {
-    const JudgedResult& one = record.measuredResults[i];
-    addResultRow(table, one.result, limitText(one.result.limit()), nameOf(one.verdict), colour);
-    for (const LimitCheck& check : checksOfResult(checks, i)) {
-      addResultRow(table, check.result, printable(labelOf(check.limit)), check.verdictName(), colour);
-    }
-  }
-  table.print(out, "  ");
-}
-
 std::size_t warningsIn(const std::vector<DiagnosticRecord>& records) {
   std::size_t warnings = 0;
   for (const DiagnosticRecord& record : records) {
@@ -161,25 +146,53 @@ std::string_view errorStageText(const DiagnosticRecord& record) {
   return isOfRecord ? "record" : nameOf(Stage::kAnalyze);
 }
 
+void printResults(std::ostream& out, const DiagnosticRecord& record, ResultRows rows, bool colour) {
+  using Align = Table::Align;
+  Table table({Align::kLeft, Align::kRight, Align::kLeft, Align::kLeft, Align::kLeft});
+  table.addRow({"Result", "Value", "Unit", "Limit", "Verdict"});
+  const std::vector<LimitCheck> checks = limitChecksOf(record);
+  bool empty = true;
+  for (std::size_t i = 0; i < record.measuredResults.size(); ++i) {
+    const JudgedResult& one = record.measuredResults[i];
+    const bool isNoteworthy = one.verdict == ResultVerdict::kFail || one.verdict == ResultVerdict::kError;
+    if (rows == ResultRows::kAll || isNoteworthy) {
+      addResultRow(table, one.result, limitText(one.result.limit()), nameOf(one.verdict), colour);
+      empty = false;
+    }
+    for (const LimitCheck& check : checksOfResult(checks, i)) {
+      addResultRow(table, check.result, printable(labelOf(check.limit)), check.verdictName(), colour);
+      empty = false;
+    }
+  }
+  if (!empty) table.print(out, "  ");
+}
+
 std::string verdictText(const DiagnosticRecord& record, bool colour) {
   const std::string word(wordOf(record));
   return colour ? std::string(colourOf(record.verdict)) + word + std::string(kPlain) : word;
+}
+
+std::string verdictColumn(const DiagnosticRecord& record, bool colour) {
+  return verdictText(record, colour) + std::string(std::string_view("ERROR ").size() - wordOf(record).size(), ' ');
 }
 
 void printRecord(std::ostream& out, const DiagnosticRecord& record, bool colour) {
   out << printable(record.name) << '\n' << indentedLines(record.summary, "  ");
   if (!record.measuredResults.empty()) {
     out << '\n';
-    printResults(out, record, colour);
+    printResults(out, record, ResultRows::kAll, colour);
   }
   out << "\n  " << verdictText(record, colour) << '\n';
   if (record.verdict == Verdict::kError) out << errorText(record.error, "    ");
   out << '\n';
 }
 
-void printVerdict(std::ostream& out, const DiagnosticRecord& record, bool colour) {
-  const std::string padding(5 - wordOf(record).size(), ' ');
-  out << verdictText(record, colour) << padding << ' ' << printable(record.name) << '\n';
+void printVerdict(std::ostream& out, const DiagnosticRecord& record, bool colour, const std::string& more,
+                  std::size_t nameWidth) {
+  const std::string name = printable(record.name);
+  out << verdictColumn(record, colour) << name;
+  if (!more.empty()) out << std::string(nameWidth > widthOf(name) ? nameWidth - widthOf(name) : 0, ' ') << "  " << more;
+  out << '\n';
 }
 
 void printSummary(std::ostream& out, const std::vector<DiagnosticRecord>& records) {

@@ -5,11 +5,19 @@
 #include "host/plugin/diagnostic_registry.h"
 #include "host/plugin/parameters.h"
 
+#include <cstddef>
 #include <ostream>
 #include <string>
 #include <vector>
 
 namespace quazor {
+
+// The capabilities of the output, and how much is shown.
+struct TextStyle {
+  bool colour = false;
+  bool blocks = false;   // supports UTF-8 and block elements
+  bool verbose = false;  // shows every result of a diagnostic
+};
 
 // The limit's name and range: "FrameTotalLimit: = 90", "Min Frame Count: >= 90", "Range: > 1, <= 2"; "-" for none.
 std::string limitText(const std::optional<QZLimit>& limit);
@@ -23,12 +31,24 @@ std::string_view errorStageText(const DiagnosticRecord& record);
 
 // "PASS", "FAIL" or "ERROR"; "DONE" for an experiment on its own that returned a result.
 std::string verdictText(const DiagnosticRecord& record, bool colour);
+// The same, padded to a column of its own.
+std::string verdictColumn(const DiagnosticRecord& record, bool colour);
 
 // Prints one diagnostic's measured results as a table, then its verdict and, for kError, the error.
 void printRecord(std::ostream& out, const DiagnosticRecord& record, bool colour);
 
-// Prints a record as one line, "PASS  NAME".
-void printVerdict(std::ostream& out, const DiagnosticRecord& record, bool colour);
+// The rows of a table of results.
+enum class ResultRows {
+  kAll,
+  kNoteworthy,  // a result that failed or cannot be judged, and every limit of the user
+};
+
+// Prints the rows as a table, or nothing if there are none.
+void printResults(std::ostream& out, const DiagnosticRecord& record, ResultRows rows, bool colour);
+
+// Prints a record as one line, "PASS  NAME", followed by `more`. The name is padded to `nameWidth` if there is more.
+void printVerdict(std::ostream& out, const DiagnosticRecord& record, bool colour, const std::string& more = {},
+                  std::size_t nameWidth = 0);
 
 // Prints one line with the number of records per verdict.
 void printSummary(std::ostream& out, const std::vector<DiagnosticRecord>& records);

@@ -60,9 +60,10 @@ TEST_F(EventPipelineTest, RecordsAndReportsARun) {
   perform(events, "B", 89);
   events.onEvent(RunEnded{std::nullopt, momentAt(99)});
   EXPECT_EQ(events.exitCode(), ExitCode::kFailed);
-  EXPECT_THAT(out_.str(),
-              testing::AllOf(HasSubstr("  PASS\n"),
-                             testing::EndsWith("2 diagnostics: 1 passed, 1 failed, 0 ended in an error\n")));
+  EXPECT_THAT(
+      out_.str(),
+      testing::AllOf(HasSubstr("PASS  A  1 result"),
+                     testing::EndsWith("2 diagnostics: 1 passed, 1 failed, 0 ended in an error\nFAIL  B: Count\n")));
   EXPECT_THAT(problemsOf(readRecord(record_).events), IsEmpty());
   EXPECT_EQ(runIn(record_).records.size(), 2U);
   EXPECT_EQ(lastRun(), directory_.read("record"));
@@ -130,7 +131,7 @@ TEST_F(EventPipelineTest, EndsADiagnosticInAnErrorWhenItsRecordCannotBeWritten) 
   perform(events, "A", 90);
   events.onEvent(RunEnded{std::nullopt, momentAt(99)});
   EXPECT_EQ(events.exitCode(), ExitCode::kError);
-  EXPECT_THAT(out_.str(), HasSubstr("  ERROR\n    QuazorHostErrorDomain code 10: the record '/dev/full' cannot be "
+  EXPECT_THAT(out_.str(), HasSubstr("\n\n  QuazorHostErrorDomain code 10: the record '/dev/full' cannot be "
                                     "written: No space left on device\n"));
   EXPECT_THAT(problemsOf(readRecord(previousRunFile()).events), IsEmpty());
 }

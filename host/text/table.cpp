@@ -12,11 +12,6 @@ namespace {
 
 constexpr std::size_t kWidestLine = 80;
 
-std::size_t widthOf(std::string_view text) {
-  return static_cast<std::size_t>(
-      std::count_if(text.begin(), text.end(), [](char unit) { return !continuesUtf8(unit); }));
-}
-
 bool isControl(unsigned char unit) { return unit < 0x20 || unit == 0x7F; }
 
 // True for the control characters U+0080 to U+009F, two bytes in UTF-8, which terminals also interpret.
@@ -71,6 +66,11 @@ std::string_view takeWord(std::string_view& text) {
 }
 
 }  // namespace
+
+std::size_t widthOf(std::string_view text) {
+  return static_cast<std::size_t>(
+      std::count_if(text.begin(), text.end(), [](char unit) { return !continuesUtf8(unit); }));
+}
 
 std::string printable(std::string_view text) { return shownText(text, ""); }
 

@@ -27,6 +27,9 @@ std::string countText(std::size_t number, std::string_view what);
 // makes its line longer.
 std::string wrapped(std::string_view text, std::string_view first, std::string_view rest);
 
+// The number of code points, which is the number of columns for most text.
+std::size_t widthOf(std::string_view text);
+
 // Cells in aligned columns. Widths count code points.
 // Thread: one at a time.
 class Table {

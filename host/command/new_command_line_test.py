@@ -1,0 +1,75 @@
+"""quazor new: the project of a plug-in, and what is refused. packaging/check_installed builds such a project."""
+
+import json
+import os
+import unittest
+
+from command_line_fixture import PLUGINS, CommandLineTest, quazor
+
+EXAMPLE = PLUGINS / "event_count.so"
+
+
+class NewCommandTest(CommandLineTest):
+    def content(self):
+        """Every path below the test's directory."""
+        return sorted(str(path.relative_to(self.directory)) for path in self.directory.rglob("*"))
+
+    def test_a_project_has_the_names_of_its_folder(self):
+        result = quazor("new", self.directory / "light_check")
+        self.assertEqual(result.returncode, 0, result.stderr)
+        project = self.directory / "light_check"
+        files = {path.name: path.read_text() for path in project.rglob("*") if path.is_file()}
+        self.assertEqual(set(files), {"CMakeLists.txt", "README.md", "light_check.cpp", "few_events.json",
+                                      "many_events.json", "channel_missing.json", "report_refused.json"})
+        self.assertIn('addDiagnosticWithName("LightCheckDiagnostic"', files["light_check.cpp"])
+        self.assertIn("quazor_add_plugin(light_check light_check.cpp)", files["CMakeLists.txt"])
+        self.assertEqual(list(json.loads(files["few_events.json"])["expect"]), ["LightCheckDiagnostic"])
+        for name, text in files.items():
+            self.assertNotIn("event_count", text, name)
+            self.assertNotIn("EventCount", text, name)
+            self.assertIn(name, result.stdout)
+        self.assertEqual(project.stat().st_mode & 0o777, 0o755)
+
+    def test_an_empty_folder_is_filled(self):
+        (self.directory / "demo").mkdir()
+        self.assertEqual(quazor("new", f"{self.directory}/demo/").returncode, 0)
+        self.assertTrue((self.directory / "demo/demo.cpp").is_file())
+
+    def test_what_is_there_is_not_touched(self):
+        (self.directory / "full").mkdir()
+        self.write("full/notes.txt", "mine")
+        self.write("file", "mine")
+        os.symlink("nowhere", self.directory / "link")
+        before = self.content()
+        for name, why in (("full", "the folder is not empty"), ("file", "there is a file of that name"),
+                          ("link", "there is a file of that name"), ("missing/demo", "No such file or directory")):
+            with self.subTest(name):
+                self.assert_refused(quazor("new", self.directory / name), 73, f"{name}' cannot be made", why)
+                self.assertEqual(self.content(), before)
+        self.assertEqual((self.directory / "full/notes.txt").read_text(), "mine")
+
+    def test_names_that_no_plug_in_can_have(self):
+        before = self.content()
+        for name in ("Demo", "1st", "my-plugin", "my plugin", "a.b", "a;b", "é", "_x", "a" * 65, "libdemo", "test", "all"):
+            with self.subTest(name):
+                self.assert_refused(quazor("new", self.directory / name), 64, f"'{name}' cannot be the name of a plug-in")
+                self.assertEqual(self.content(), before)
+        self.assertEqual(quazor("new", "/").returncode, 64)
+        self.assertEqual(quazor("new").returncode, 64)
+        self.assertEqual(quazor("new", "one", "two").returncode, 64)
+
+    def test_selftest_judges_the_phones_of_a_project(self):
+        self.assertEqual(quazor("new", self.directory / "event_count").returncode, 0)
+        phones = sorted((self.directory / "event_count/phones").glob("*.json"))
+        result = quazor("selftest", *phones, "--plugin", EXAMPLE)
+        self.assertEqual(result.returncode, 0, result.stdout + result.stderr)
+        for phone in phones:
+            self.assertIn(str(phone), result.stdout)
+        wrong = json.loads(phones[0].read_text())
+        wrong["expect"]["EventCountDiagnostic"] = {"verdict": "pass"}
+        phones[0].write_text(json.dumps(wrong))
+        self.assertEqual(quazor("selftest", *phones, "--plugin", EXAMPLE).returncode, 1)
+
+
+if __name__ == "__main__":
+    unittest.main()

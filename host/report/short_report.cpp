@@ -1,0 +1,132 @@
+#include "host/report/short_report.h"
+
+#include "contract/message_format.h"
+#include "host/model/limit_check.h"
+#include "host/report/text_report.h"
+#include "host/text/shell_word.h"
+#include "host/text/table.h"
+
+#include <algorithm>
+#include <sstream>
+#include <string_view>
+#include <utility>
+
+namespace quazor {
+
+namespace {
+
+// Telling more would push the other diagnostics off the screen.
+constexpr std::size_t kMaxNamed = 3;
+
+// The verdict on a result by its own limit and those of the user that count.
+ResultVerdict verdictOf(const JudgedResult& one, const std::vector<LimitCheck>& checksOfIt) {
+  ResultVerdict verdict =
+      checksOfIt.empty() || one.verdict != ResultVerdict::kNone ? one.verdict : ResultVerdict::kPass;
+  for (const LimitCheck& check : checksOfIt) {
+    if (check.passed || !check.counts() || verdict == ResultVerdict::kError) continue;
+    verdict = check.problem.empty() ? ResultVerdict::kFail : ResultVerdict::kError;
+  }
+  return verdict;
+}
+
+std::vector<ResultVerdict> verdictsOf(const DiagnosticRecord& record, const std::vector<LimitCheck>& checks) {
+  std::vector<ResultVerdict> verdicts;
+  for (std::size_t i = 0; i < record.measuredResults.size(); ++i) {
+    verdicts.push_back(verdictOf(record.measuredResults[i], checksOfResult(checks, i)));
+  }
+  return verdicts;
+}
+
+// The results that failed, each once, in their order.
+std::vector<std::string> failedResults(const DiagnosticRecord& record) {
+  const std::vector<ResultVerdict> verdicts = verdictsOf(record, limitChecksOf(record));
+  std::vector<std::string> names;
+  for (std::size_t i = 0; i < verdicts.size(); ++i) {
+    const std::string& name = record.measuredResults[i].result.name();
+    const bool isNew = std::find(names.begin(), names.end(), name) == names.end();
+    if (verdicts[i] == ResultVerdict::kFail && isNew) names.push_back(name);
+  }
+  return names;
+}
+
+// "A, B, C and 57 more".
+std::string listText(const std::vector<std::string>& names) {
+  std::string text;
+  for (std::size_t i = 0; i < std::min(names.size(), kMaxNamed); ++i) text += (i == 0 ? "" : ", ") + names[i];
+  if (names.size() > kMaxNamed) text += formatMessage(" and %@ more", names.size() - kMaxNamed);
+  return text;
+}
+
+std::string failureText(const DiagnosticRecord& record) {
+  if (record.error != nullptr) return formatMessage("%@ code %@", record.error->domain(), record.error->code());
+  return listText(failedResults(record));
+}
+
+// What to ask about a diagnostic that did not pass, the most specific first.
+std::vector<std::string> topicsOf(const DiagnosticRecord& record) {
+  std::vector<std::string> topics;
+  if (record.error != nullptr) {
+    topics.push_back(formatMessage("%@:%@", record.error->domain(), record.error->code()));
+  } else {
+    topics = failedResults(record);
+  }
+  topics.push_back(record.name);
+  return topics;
+}
+
+void addCount(std::string& text, std::size_t number, std::string_view one, std::string_view several) {
+  if (number > 0) text += formatMessage(", %@ %@", number, number == 1 ? one : several);
+}
+
+}  // namespace
+
+std::string resultCountsText(const DiagnosticRecord& record) {
+  if (record.measuredResults.empty()) return {};
+  const std::vector<LimitCheck> checks = limitChecksOf(record);
+  const std::vector<ResultVerdict> verdicts = verdictsOf(record, checks);
+  const auto countOf = [&verdicts](ResultVerdict verdict) {
+    return static_cast<std::size_t>(std::count(verdicts.begin(), verdicts.end(), verdict));
+  };
+  std::string text = countText(verdicts.size(), "result");
+  const std::size_t limited = verdicts.size() - countOf(ResultVerdict::kNone);
+  if (limited == 0) text += ", none with a limit";
+  addCount(text, limited, "with a limit", "with limits");
+  addCount(text, countOf(ResultVerdict::kFail), "failed", "failed");
+  addCount(text, countOf(ResultVerdict::kError), "not judged", "not judged");
+  const auto isWarning = [](const LimitCheck& check) { return !check.passed && !check.counts(); };
+  addCount(text, static_cast<std::size_t>(std::count_if(checks.begin(), checks.end(), isWarning)), "warning",
+           "warnings");
+  return text;
+}
+
+void printShortRecord(std::ostream& out, const DiagnosticRecord& record, bool colour, std::size_t nameWidth) {
+  printVerdict(out, record, colour, resultCountsText(record), nameWidth);
+  const bool passed = record.verdict == Verdict::kPass;
+  std::ostringstream table;
+  printResults(table, record, ResultRows::kNoteworthy, colour);
+  if (!passed) out << indentedLines(record.summary, "  ");
+  if (record.verdict == Verdict::kError) out << '\n' << errorText(record.error, "  ");
+  if (!table.view().empty()) out << (passed ? "" : "\n") << table.str();
+  if (!passed || !table.view().empty()) out << '\n';
+}
+
+void printFailures(std::ostream& out, const std::vector<DiagnosticRecord>& records, bool colour,
+                   const std::function<bool(const std::string& topic)>& isExplained) {
+  std::vector<std::string> asked;
+  for (const DiagnosticRecord& record : records) {
+    if (record.verdict == Verdict::kPass) continue;
+    out << verdictColumn(record, colour) << printable(record.name);
+    if (const std::string text = failureText(record); !text.empty()) out << ": " << printable(text);
+    out << '\n';
+    if (!isExplained) continue;
+    const std::vector<std::string> topics = topicsOf(record);
+    const auto found = std::find_if(topics.begin(), topics.end(), isExplained);
+    if (found != topics.end() && std::find(asked.begin(), asked.end(), *found) == asked.end()) asked.push_back(*found);
+  }
+  if (asked.empty()) return;
+  out << "Next: quazor explain";
+  for (const std::string& topic : asked) out << ' ' << shellWord(topic);
+  out << '\n';
+}
+
+}  // namespace quazor

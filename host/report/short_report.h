@@ -1,0 +1,26 @@
+// The short text report: one line for a diagnostic that passes, and what did not pass again at the end.
+#pragma once
+
+#include "host/model/diagnostic_record.h"
+
+#include <cstddef>
+#include <functional>
+#include <ostream>
+#include <string>
+#include <vector>
+
+namespace quazor {
+
+// "9 results, 2 with limits, 1 failed, 1 warning"; empty without results.
+std::string resultCountsText(const DiagnosticRecord& record);
+
+// Prints the verdict in one line with the number of results, the rows of results that are noteworthy
+// (text_report.h) and, unless the diagnostic passed, its summary and its error. The name is padded to `nameWidth`.
+void printShortRecord(std::ostream& out, const DiagnosticRecord& record, bool colour, std::size_t nameWidth);
+
+// Prints a line for each diagnostic that did not pass, with the results that failed or with its error, and then the
+// command that explains them; nothing if all passed. The command names only what `isExplained` accepts.
+void printFailures(std::ostream& out, const std::vector<DiagnosticRecord>& records, bool colour,
+                   const std::function<bool(const std::string& topic)>& isExplained);
+
+}  // namespace quazor

@@ -1,0 +1,109 @@
+#include "host/report/short_report.h"
+
+#include "host/testing/test_records.h"
+
+#include <gmock/gmock.h>
+#include <gtest/gtest.h>
+
+#include <sstream>
+
+namespace quazor {
+namespace {
+
+std::string shortText(const DiagnosticRecord& record, std::size_t nameWidth = 0) {
+  std::ostringstream out;
+  printShortRecord(out, record, false, nameWidth);
+  return out.str();
+}
+
+std::string failures(const std::vector<DiagnosticRecord>& records,
+                     const std::function<bool(const std::string&)>& isExplained = {}) {
+  std::ostringstream out;
+  printFailures(out, records, false, isExplained);
+  return out.str();
+}
+
+DiagnosticRecord withLimit(DiagnosticRecord record, std::string_view text, LimitSeverity severity) {
+  UserLimit limit = parseUserLimit(text);
+  limit.severity = severity;
+  limit.source = "command line";
+  record.limits.push_back(limit);
+  return record;
+}
+
+TEST(ResultCounts, TellHowManyResultsHaveALimit) {
+  DiagnosticRecord record = recordOf("A", Verdict::kPass);
+  EXPECT_EQ(resultCountsText(record), "2 results, 1 with a limit");
+  EXPECT_EQ(resultCountsText(withLimit(record, "Offset > 0", LimitSeverity::kFail)), "2 results, 2 with limits");
+  EXPECT_EQ(resultCountsText(withLimit(record, "Count < 80", LimitSeverity::kWarn)),
+            "2 results, 1 with a limit, 1 warning");
+  EXPECT_EQ(resultCountsText(withLimit(record, "Count < 80", LimitSeverity::kFail)),
+            "2 results, 1 with a limit, 1 failed");
+  EXPECT_EQ(resultCountsText(withLimit(record, "Count < Offset", LimitSeverity::kFail)),
+            "2 results, 1 with a limit, 1 not judged");
+  record.measuredResults.erase(record.measuredResults.begin());
+  EXPECT_EQ(resultCountsText(record), "1 result, none with a limit");
+  record.measuredResults.clear();
+  EXPECT_EQ(resultCountsText(record), "");
+}
+
+TEST(PrintShortRecord, IsOneLineForADiagnosticThatPasses) {
+  EXPECT_EQ(shortText(recordOf("A", Verdict::kPass), 4), "PASS  A     2 results, 1 with a limit\n");
+}
+
+TEST(PrintShortRecord, ShowsTheRowsThatFailOrHaveALimitOfTheUser) {
+  EXPECT_EQ(shortText(recordOf("A", Verdict::kFail)),
+            "FAIL  A  2 results, 1 with a limit, 1 failed\n"
+            "  Its summary.\n"
+            "\n"
+            "  Result  Value  Unit    Limit          Verdict\n"
+            "  Count      89  frames  Enough: >= 90  fail\n"
+            "\n");
+  EXPECT_EQ(shortText(withLimit(recordOf("A", Verdict::kPass), "Offset > 0", LimitSeverity::kFail)),
+            "PASS  A  2 results, 2 with limits\n"
+            "  Result  Value  Unit    Limit                      Verdict\n"
+            "  Offset    0.5  events  Offset > 0 (command line)  pass\n"
+            "\n");
+}
+
+TEST(PrintShortRecord, ShowsTheErrorAndItsCause) {
+  DiagnosticRecord record = recordOf("A", Verdict::kError);
+  record.measuredResults.clear();
+  EXPECT_EQ(shortText(record),
+            "ERROR A\n"
+            "  Its summary.\n"
+            "\n"
+            "  Domain code -1: it failed\n"
+            "  caused by Deep code 2: the cause\n"
+            "\n");
+}
+
+TEST(PrintFailures, NamesWhatDidNotPassAndTheCommandThatExplainsIt) {
+  const std::vector<DiagnosticRecord> records = {recordOf("A", Verdict::kPass), recordOf("B\033", Verdict::kFail),
+                                                 recordOf("C", Verdict::kError), recordOf("D", Verdict::kError)};
+  const std::string lines = "FAIL  B\\x1b: Count\nERROR C: Domain code -1\nERROR D: Domain code -1\n";
+  EXPECT_EQ(failures(records), lines);
+  EXPECT_EQ(failures(records, [](const std::string&) { return false; }), lines);
+  EXPECT_EQ(failures(records, [](const std::string&) { return true; }),
+            lines + "Next: quazor explain Count Domain:-1\n");
+  EXPECT_EQ(failures(records, [](const std::string& topic) { return topic == "D"; }),
+            lines + "Next: quazor explain D\n");
+  EXPECT_EQ(failures({recordOf("A", Verdict::kPass)}, [](const std::string&) { return true; }), "");
+}
+
+TEST(PrintFailures, NamesNotMoreThanThreeResults) {
+  DiagnosticRecord record = recordOf("A", Verdict::kFail);
+  record.measuredResults.clear();
+  for (const char* name : {"a b", "c", "d", "e", "e", "f"}) {
+    QZMeasuredResult result(name, Measurement(1, QZDimensionlessUnit::events()));
+    QZLimit limit("L");
+    limit.setUpperBound(std::make_shared<const QZBound>(Measurement(0, QZDimensionlessUnit::events()), false));
+    result.setLimit(std::move(limit));
+    record.measuredResults.push_back(judgeResult(result));
+  }
+  EXPECT_EQ(failures({record}, [](const std::string&) { return true; }),
+            "FAIL  A: a b, c, d and 2 more\nNext: quazor explain 'a b'\n");
+}
+
+}  // namespace
+}  // namespace quazor
