@@ -71,8 +71,8 @@ def measured(build, repetitions, floods):
         rates, medians["lost"] = [], 0
         record = os.path.join(state, "record.jsonl")
         for _ in range(floods):
-            empty = seconds_of([*flood, "--record", record, "--set", "count=0"], state)
-            full = seconds_of([*flood, "--record", record, "--set", f"count={LINES}"], state)
+            empty = seconds_of([*flood, "--record", record, "--replace", "--set", "count=0"], state)
+            full = seconds_of([*flood, "--record", record, "--replace", "--set", f"count={LINES}"], state)
             rates.append(LINES / (full - empty))
             medians["lost"] += LINES - lines_in(record)
         medians["lines"] = statistics.median(rates)

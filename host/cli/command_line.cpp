@@ -44,6 +44,7 @@ struct RawOptions {
   std::string format = "text";
   ChoiceTexts choice;
   bool all = false;
+  bool replace = false;
   bool realTime = false;
   bool systemLog = false;
   bool inProcess = false;
@@ -186,8 +187,12 @@ void addLogOptions(CLI::App& command, RawOptions& raw) {
 }
 
 void addRecord(CLI::App& command, RawOptions& raw) {
-  command.add_option("--record", raw.record, "Record every event of the run in this file as it happens")
-      ->type_name("FILE");
+  command
+      .add_option(
+          "--record", raw.record,
+          "Record every event of the run in this new file as it happens, or in one of its own in the folder DIR")
+      ->type_name("FILE|DIR/");
+  command.add_flag("--replace", raw.replace, "Replace the file of --record if it exists");
 }
 
 void addRunOptions(CLI::App& command, RawOptions& raw, const std::string& what) {
@@ -284,6 +289,8 @@ Options optionsOf(const CLI::App& command, const RawOptions& raw) {
   options.parameterFiles.assign(raw.parameterFiles.begin(), raw.parameterFiles.end());
   options.records.assign(raw.records.begin(), raw.records.end());
   options.record = raw.record;
+  options.replace = raw.replace;
+  if (raw.replace && raw.record.empty()) throw CommandError(ExitCode::kUsage, "--replace requires --record");
   options.onlyFailed = raw.only == "failed";
   options.failedOf = raw.of;
   options.phone = raw.phone;

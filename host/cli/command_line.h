@@ -53,7 +53,7 @@ struct Options {
   OrderedMap<std::string> tags;
   std::vector<std::filesystem::path> parameterFiles;
   std::vector<std::filesystem::path> records;  // to read
-  std::filesystem::path record;                // to write; empty: none
+  std::filesystem::path record;                // to write, or the folder for it; empty: none
   std::filesystem::path failedOf;              // the record for --only failed; empty: that of the last run
   std::filesystem::path profile;               // empty: the installed one
   std::optional<Profile> recorded;             // the parameters of the run that is repeated
@@ -70,6 +70,7 @@ struct Options {
   Command command = Command::kList;
   bool all = false;
   bool onlyFailed = false;
+  bool replace = false;  // an existing record
   bool withoutProfile = false;
   bool realTime = false;
   bool systemLog = false;

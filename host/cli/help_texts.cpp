@@ -25,7 +25,7 @@ constexpr Example kExamples[] = {
     {"quazor phone probe", "find this machine's devices and print a starter binding"},
     {"quazor run --all --phone linux:board.json", "run on this machine's own cameras, sensors and counters"},
     {"quazor run --all --limit '*.Total >= 90'", "also judge by a limit of your own"},
-    {"quazor run --all --record run.jsonl --tag serial=C02X --output junit:report.xml"},
+    {"quazor run --all --record records/ --tag serial=C02X --output junit:report.xml"},
     {"quazor run --only failed", "rerun the diagnostics that did not pass last time"},
     {"quazor experiment CameraSyncExperiment.Back", "measure without judging"},
     {"quazor verify run.jsonl", "check that the recorded verdicts follow from the data"},
@@ -56,7 +56,7 @@ constexpr ExitCodeHelp kExitCodes[] = {
     {66, "a plug-in, scenario, binding, profile or record cannot be read or loaded",
      "list describe run experiment verify analyze diff explain doctor selftest new"},
     {70, "quazor itself failed", {}},
-    {73, "a report or record cannot be written", {}},
+    {73, "a report or record cannot be written, or the record exists already", {}},
     {130, "interrupted", "list describe run experiment analyze doctor selftest"},
 };
 

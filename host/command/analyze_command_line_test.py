@@ -81,7 +81,7 @@ class ForeignRecordTest(RecordTest):
 
     def installed(self, *arguments):
         """Records a run of an installed plug-in."""
-        result = quazor("run", "TesselTelemonDiagnostic", "--record", self.record, *arguments, env=self.state)
+        result = quazor("run", "TesselTelemonDiagnostic", "--record", self.record, "--replace", *arguments, env=self.state)
         self.assertEqual(result.returncode, 0, result.stderr)
 
     def test_an_analysis_loads_no_plug_in_that_is_not_installed(self):

@@ -110,7 +110,7 @@ class RecordTest(CommandLineTest):
     def recorded(self, *arguments, code=0, record=None, **options):
         """Returns a record of a run of the fake diagnostic."""
         record = record or self.record
-        result = self.run_fake("--record", record, *arguments, **options)
+        result = self.run_fake("--record", record, "--replace", *arguments, **options)
         self.assertEqual(result.returncode, code, result.stderr)
         return record
 

@@ -11,7 +11,7 @@ class IdentityTest(CommandLineTest):
         record = self.directory / "record.jsonl"
         begun = []
         for _ in range(2):
-            self.run_fake("--record", record, "--tag", "serial=C02X", env={"QUAZOR_TAGS": "serial=old station=S3"})
+            self.run_fake("--record", record, "--replace", "--tag", "serial=C02X", env={"QUAZOR_TAGS": "serial=old station=S3"})
             begun.append(events_in(record)[0])
         self.assertRegex(begun[0]["id"], "^[0-9a-f]{32}$")
         self.assertNotEqual(begun[0]["id"], begun[1]["id"])

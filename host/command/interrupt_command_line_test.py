@@ -23,7 +23,7 @@ class InterruptTest(CommandLineTest):
     def interrupted(self, *arguments, signals=(signal.SIGINT,), grace="0.5"):
         """Runs one diagnostic that ends at once and two that never end in time, and interrupts the second."""
         process = start("run", *self.NAMES, "--plugin", WORKING, "--phone", self.phone, "--profile", "none",
-                        "--realtime", "--set", "duration=60", "--record", self.record, "--grace", grace, *arguments)
+                        "--realtime", "--set", "duration=60", "--record", self.record, "--replace", "--grace", grace, *arguments)
         self.addCleanup(process.kill)
         line = process.stderr.readline()  # the first log line: the second diagnostic is running
         self.assertIn("an error line", line)

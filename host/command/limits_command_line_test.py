@@ -40,7 +40,7 @@ class LimitsTest(CommandLineTest):
         for limit in (f"{self.name}x > 0", f"Nowhere:{self.name} > 0"):
             with self.subTest(limit=limit):
                 record = self.directory / "record.jsonl"
-                done = self.run_limited("--limit", limit, "--record", record)
+                done = self.run_limited("--limit", limit, "--record", record, "--replace")
                 self.assertEqual(done.returncode, 2, done.stdout)
                 self.assertIn(f"code 14: the limit '{limit}' (command line) was compared with nothing", done.stdout)
                 self.assertEqual(quazor("verify", record).returncode, 0)
@@ -49,7 +49,7 @@ class LimitsTest(CommandLineTest):
         record = self.directory / "record.jsonl"
         for limit in ("", "Total", "Total = 1", "Total > 1 +- 1", "Total in [2, 1]", "Total > nan"):
             with self.subTest(limit=limit):
-                done = self.run_limited("--limit", limit, "--record", record)
+                done = self.run_limited("--limit", limit, "--record", record, "--replace")
                 # Without quotation marks, nan is the name of a result.
                 self.assertEqual(done.returncode, 2 if limit.endswith("nan") else 64)
                 if done.returncode == 64:
@@ -93,7 +93,7 @@ class LimitsTest(CommandLineTest):
     def test_the_record_keeps_the_limits(self):
         record = self.directory / "record.jsonl"
         limit = f"{self.name} < {self.value}"
-        self.assertEqual(self.run_limited("--limit", limit, "--record", record).returncode, 1)
+        self.assertEqual(self.run_limited("--limit", limit, "--record", record, "--replace").returncode, 1)
         self.assertEqual(events_in(record)[0]["limits"],
                          [{"limit": limit, "severity": "fail", "source": "command line", "onlyIfSelected": False}])
         self.assertEqual(quazor("verify", record).returncode, 0)
@@ -108,7 +108,7 @@ class LimitsTest(CommandLineTest):
 
     def test_an_entry_that_was_removed_is_missed(self):
         record = self.directory / "record.jsonl"
-        self.run_limited("--limit", "Nowhere > 0", "--record", record)
+        self.run_limited("--limit", "Nowhere > 0", "--record", record, "--replace")
         events = events_in(record)
         begin = next(i for i, one in enumerate(events) if one.get("name") == "Nowhere > 0")
         del events[begin:begin + 3]

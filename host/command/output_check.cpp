@@ -76,6 +76,9 @@ void checkOutputs(const Options& options, const Installation& installation, cons
     check(file);
   };
   check(options.record);
+  // A folder that will be made for the record.
+  const fs::path folder = options.record.parent_path();
+  if (std::error_code ignored; !folder.empty() && !fs::exists(folder, ignored)) outputs.push_back(folder);
   if (!options.report.output.empty()) checkReport(options.report.output);
   for (const OutputRequest& output : options.report.outputs) checkReport(output.file);
 }

@@ -62,7 +62,7 @@ class OutputFilesTest(CommandLineTest):
         left = [self.directory / f".{name}.quazor-1.tmp" for name in ("run.jsonl", "out.json")]
         for file in left:
             file.write_text("half a")
-        result = self.run_fake("--record", self.record, "--format", "json", "--output", self.output)
+        result = self.run_fake("--record", self.record, "--replace", "--format", "json", "--output", self.output)
         self.assertEqual(result.returncode, 0, result.stderr)
         self.assertEqual([file for file in left if file.exists()], [])
 
@@ -119,10 +119,10 @@ class OutputFilesTest(CommandLineTest):
     def test_a_record_that_another_host_is_writing(self):
         with open(self.record, "rb") as busy:
             fcntl.flock(busy, fcntl.LOCK_EX)
-            result = self.run_fake("--record", self.record)
-            self.assert_refused(result, 73, "another process is writing it")
+            for option, why in (("--replace", "another process is writing it"), ("--in-process", "it exists already")):
+                self.assert_refused(self.run_fake("--record", self.record, option), 73, why)
             self.assertEqual(self.record.read_bytes(), self.before[self.record])
-        self.assertEqual(self.run_fake("--record", self.record).returncode, 0)
+        self.assertEqual(self.run_fake("--record", self.record, "--replace").returncode, 0)
 
     def test_a_format_that_is_none(self):
         result = self.run_fake("--output", "xml:report", cwd=self.directory)

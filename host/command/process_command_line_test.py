@@ -132,7 +132,7 @@ class ProcessTest(CommandLineTest):
         for arguments in ([], ["--in-process"]):
             with self.subTest(arguments):
                 record = self.directory / "run.jsonl"
-                result = self.run_fake("--log-limit", "1", "--record", record, "--log-level", "debug", *arguments)
+                result = self.run_fake("--log-limit", "1", "--record", record, "--replace", "--log-level", "debug", *arguments)
                 self.assertEqual(result.returncode, 0, result.stderr)
                 texts = [event["text"] for event in events_in(record) if event["event"] == "log"]
                 self.assertEqual(len(texts), 2, texts)

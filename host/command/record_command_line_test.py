@@ -48,7 +48,7 @@ class MakingTest(RecordTest):
         self.assert_verifies(self.record)
 
     def test_a_record_that_cannot_be_made_is_refused_before_anything_runs(self):
-        rows = {self.directory / "nowhere" / "out": "No such file or directory", self.directory: "it is a directory",
+        rows = {self.directory / "nowhere" / "out": "No such file or directory",
                 self.phone / "out": "Not a directory"}
         for path, why in rows.items():
             with self.subTest(path):

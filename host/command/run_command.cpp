@@ -8,6 +8,7 @@
 #include "host/device/phone.h"
 #include "host/error/host_error.h"
 #include "host/model/limit_check.h"
+#include "host/record/record_place.h"
 #include "host/run/event_pipeline.h"
 #include "host/run/isolation.h"
 #include "host/system/identity.h"
@@ -19,6 +20,7 @@
 
 #include <algorithm>
 #include <chrono>
+#include <memory>
 #include <optional>
 #include <thread>
 #include <utility>
@@ -118,10 +120,23 @@ RunStarted beginningOf(const Options& options, const Installation& installation,
   return began;
 }
 
-EventPipelineOptions eventOptions(const Options& options, const Installation& installation, bool keepsLastRun) {
-  ReportOptions report = options.report;
-  report.text.isExplained = explainedTopics(installation.explanations());
-  return {options.record, keepsLastRun, options.systemLog, std::move(report), options.logLimit};
+// Checks the outputs and makes those that receive events. A record in a folder gets its name from the run.
+std::unique_ptr<EventPipeline> beginEvents(Options options, const Installation& installation, const RunStarted& began,
+                                           bool keepsLastRun, Console& console) {
+  const std::filesystem::path folder = isFolderOfRecords(options.record) ? options.record : "";
+  if (!folder.empty()) options.record = folder / recordNameOf(began);
+  checkOutputs(options, installation, began);
+  if (!folder.empty()) makeFolderOfRecords(folder);
+  EventPipelineOptions outputs;
+  outputs.record = options.record;
+  outputs.replacesRecord = options.replace;
+  outputs.tellsRecord = !folder.empty();
+  outputs.keepsLastRun = keepsLastRun;
+  outputs.systemLog = options.systemLog;
+  outputs.report = options.report;
+  outputs.report.text.isExplained = explainedTopics(installation.explanations());
+  outputs.logLimit = options.logLimit;
+  return std::make_unique<EventPipeline>(outputs, console);
 }
 
 // The time to wait between two diagnostics. Each gets a new phone, so the time of one that is simulated passes at once.
@@ -133,8 +148,8 @@ std::chrono::nanoseconds realSettleOf(const Options& options) {
 ExitCode perform(const Options& options, const Installation& installation, Console& console, RunStarted began,
                  const std::vector<Job>& jobs, const std::vector<FailedPlugin>& failed, const RunOptions& runOptions,
                  WatchedSignals* signals) {
-  checkOutputs(options, installation, began);
-  EventPipeline events(eventOptions(options, installation, options.command == Command::kRun), console);
+  const auto pipeline = beginEvents(options, installation, began, options.command == Command::kRun, console);
+  EventPipeline& events = *pipeline;
   std::optional<InterruptWatcher> watcher;
   if (options.inProcess) {
     watcher.emplace([&events] { events.interruptAndLeave([] { ::_exit(static_cast<int>(ExitCode::kInterrupted)); }); });
@@ -171,14 +186,13 @@ ExitCode perform(const Options& options, const Installation& installation, Conso
 ExitCode performNothing(const Options& options, const Installation& installation, Console& console) {
   RunStarted began = beginningOf(options, installation, {}, {});
   began.phone = options.phone.string();
-  checkOutputs(options, installation, began);
+  const auto events = beginEvents(options, installation, began, false, console);
+  events->onEvent(std::move(began));
   const bool isForPeople = options.report.format == Format::kText || !options.report.output.empty();
   (isForPeople ? console.out : console.err) << "Everything passed in the last run.\n" << std::flush;
-  EventPipeline events(eventOptions(options, installation, false), console);
-  events.onEvent(std::move(began));
-  events.onEvent(RunEnded{std::nullopt, dateNow()});
-  events.requireRecords();
-  return events.exitCode();
+  events->onEvent(RunEnded{std::nullopt, dateNow()});
+  events->requireRecords();
+  return events->exitCode();
 }
 
 // Returns the name of the selected phone, as records have it.

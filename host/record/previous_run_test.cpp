@@ -42,7 +42,7 @@ class NamesNotPassedTest : public testing::Test {
   std::vector<std::string> namesAfter(const std::vector<RunEvent>& events) const {
     const std::filesystem::path file = directory_.path() / "record";
     {
-      RecordWriter writer(file);
+      RecordWriter writer(file, RecordWriter::Existing::kReplace);
       for (const RunEvent& event : events) writer.onEvent(event);
     }
     return failedNames(runIn(file));

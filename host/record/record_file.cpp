@@ -28,6 +28,11 @@ namespace {
 
 using Json = nlohmann::ordered_json;
 
+constexpr mode_t kMode = 0666;  // reduced by the umask
+constexpr const char* kBusy = "another process is writing it";
+constexpr const char* kExists =
+    "it exists already; replace it with --replace, or give each record a name of its own with --record DIR/";
+
 [[noreturn]] void refuseLine(const std::filesystem::path& file, std::uint64_t line, const std::string& why) {
   throw RecordDefect(ExitCode::kCannotRead,
                      "the record '" + file.string() + "', line " + std::to_string(line) + ": " + why);
@@ -37,6 +42,7 @@ using Json = nlohmann::ordered_json;
 class Descriptor {
  public:
   explicit Descriptor(int number) : number_(number) {}
+  Descriptor(Descriptor&& other) noexcept : number_(std::exchange(other.number_, -1)) {}
   Descriptor(const Descriptor&) = delete;
   Descriptor& operator=(const Descriptor&) = delete;
   ~Descriptor() {
@@ -46,8 +52,20 @@ class Descriptor {
   int number() const { return number_; }
 
  private:
-  const int number_;
+  int number_;
 };
+
+// The file, if there is one, locked so that nobody else takes it for a finished record. Refuses one that is being
+// written.
+template <typename Refuse>
+Descriptor lockOld(const std::filesystem::path& file, const Refuse& refuse) {
+  for (;;) {
+    Descriptor old(::open(file.c_str(), O_RDONLY | O_NOFOLLOW | O_CLOEXEC));
+    if (old.number() < 0) return old;
+    if (::flock(old.number(), LOCK_EX | LOCK_NB) != 0 && errno == EWOULDBLOCK) refuse(kBusy);
+    if (isSameFile(old.number(), file)) return old;  // not replaced in the meantime
+  }
+}
 
 // Reads a line without its line end, like std::getline, but stops after a line that is too long to be accepted.
 bool readLine(std::istream& stream, std::string& line) {
@@ -105,9 +123,11 @@ std::string recordLine(const RunEvent& event, std::uint64_t sequence) {
   return line.dump(-1, ' ', false, Json::error_handler_t::replace) + "\n";
 }
 
-RecordWriter::RecordWriter(std::filesystem::path file, Unfinished unfinished) : file_(std::move(file)) {
-  if (unfinished == Unfinished::kReplace) {
-    create(file_, unfinished);
+RecordWriter::RecordWriter(std::filesystem::path file, Existing existing) : file_(std::move(file)) {
+  if (existing == Existing::kReplaceAll) {
+    createReplacement(file_);
+    if (const int failure = replacement_->putInPlace(true); failure != 0) refuse(std::strerror(failure));
+    replacement_.reset();
     return;
   }
   std::error_code error;
@@ -118,42 +138,60 @@ RecordWriter::RecordWriter(std::filesystem::path file, Unfinished unfinished) : 
     if (descriptor_ < 0) refuse(std::strerror(errno));
     return;
   }
+  if (existing == Existing::kRefuse) {
+    create(file_);
+    return;
+  }
   // Resolves a symbolic link, because a rename would replace the link itself.
   const std::filesystem::path canonical = std::filesystem::weakly_canonical(file_, error);
-  create(error ? file_ : canonical, unfinished);
+  createReplacement(error ? file_ : canonical);
+  const Descriptor old = lockOld(target_, [this](const char* why) { refuse(why); });
+  inheritOld();
 }
 
 void RecordWriter::refuse(const std::string& why) const {
   throw CommandError(ExitCode::kCannotWrite, "the record '" + file_.string() + "' cannot be written: " + why);
 }
 
-void RecordWriter::create(const std::filesystem::path& target, Unfinished unfinished) {
+// Of all processes that do this at once, one makes the file.
+void RecordWriter::create(const std::filesystem::path& target) {
+  descriptor_ = ::open(target.c_str(), O_WRONLY | O_CREAT | O_EXCL | O_CLOEXEC, kMode);
+  if (descriptor_ < 0) refuse(errno == EEXIST ? kExists : std::strerror(errno));
+  // Another process that means to replace it may have been quicker.
+  const bool isLocked = ::flock(descriptor_, LOCK_EX | LOCK_NB) == 0 || errno != EWOULDBLOCK;
+  if (!isLocked || !isSameFile(descriptor_, target)) {
+    ::close(descriptor_);
+    refuse(kBusy);
+  }
+}
+
+void RecordWriter::createReplacement(const std::filesystem::path& target) {
   try {
-    ReplacementFile created(target);
-    if (const int failure = unfinished == Unfinished::kReplace ? created.putInPlace(true) : replace(target, created);
-        failure != 0) {
-      refuse(std::strerror(failure));
-    }
-    descriptor_ = ::fcntl(created.descriptor(), F_DUPFD_CLOEXEC, 0);  // keeps the lock
+    target_ = target;
+    replacement_.emplace(target);
+    descriptor_ = ::fcntl(replacement_->descriptor(), F_DUPFD_CLOEXEC, 0);  // keeps the lock
   } catch (const std::system_error& problem) {
     refuse(std::strerror(problem.code().value()));
   }
 }
 
-// Puts the new file in the place of a record that nobody is writing. Returns 0 or an error number.
-int RecordWriter::replace(const std::filesystem::path& target, ReplacementFile& created) const {
+// Returns false if there is no file to be replaced.
+bool RecordWriter::inheritOld() const {
+  struct stat status {};
+  if (::lstat(target_.c_str(), &status) != 0) return false;
+  if (replacement_->inherit(status) == EPERM && status.st_uid != ::geteuid()) refuse(kOfAnotherUser);
+  return true;
+}
+
+// Puts the new file in the place of a record that nobody is writing.
+void RecordWriter::putInPlace() {
   for (;;) {
-    const Descriptor old(::open(target.c_str(), O_RDONLY | O_NOFOLLOW | O_CLOEXEC));
-    if (old.number() >= 0) {
-      if (::flock(old.number(), LOCK_EX | LOCK_NB) != 0 && errno == EWOULDBLOCK)
-        refuse("another process is writing it");
-      if (!isSameFile(old.number(), target)) continue;  // replaced in the meantime
-    }
-    struct stat status {};
-    const bool exists = ::lstat(target.c_str(), &status) == 0;
-    if (exists && created.inherit(status) == EPERM && status.st_uid != ::geteuid()) refuse(kOfAnotherUser);
-    const int failure = created.putInPlace(exists);
-    if (failure != EEXIST) return failure;  // otherwise created in the meantime
+    const Descriptor old = lockOld(target_, [this](const char* why) { refuse(why); });
+    const int failure = replacement_->putInPlace(inheritOld());
+    if (failure == EEXIST) continue;  // created in the meantime
+    if (failure != 0) refuse(std::strerror(failure));
+    replacement_.reset();
+    return;
   }
 }
 
@@ -164,9 +202,13 @@ void RecordWriter::onEvent(const RunEvent& event, const std::string& line) {
   if (!problem_.empty()) return;
   if (line.size() - 1 > kMaxLine) {
     problem_ = "an event takes more than " + std::to_string(kMaxLine >> 20U) + " MiB";
-    return;
+  } else {
+    write(line);
   }
-  write(line);
+  if (replacement_) {
+    if (!problem_.empty()) refuse(problem_);
+    putInPlace();
+  }
   // The outcome of a run must survive a crash of the machine.
   if (std::holds_alternative<RunEnded>(event) && problem_.empty()) ::fdatasync(descriptor_);
 }

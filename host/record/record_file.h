@@ -7,6 +7,7 @@
 
 #include <cstdint>
 #include <filesystem>
+#include <optional>
 #include <string>
 #include <vector>
 
@@ -24,17 +25,20 @@ std::string recordLine(const RunEvent& event, std::uint64_t sequence);
 // Thread: one at a time.
 class RecordWriter final : public RunEventSink {
  public:
-  // What happens to an existing record that another writer has not finished. With kReplace whatever is at the place is
-  // replaced, also a link or a pipe, which somebody may have planted there.
-  enum class Unfinished { kRefuse, kReplace };
+  // What happens to a file that exists already. kReplace refuses only a record that another writer has not finished,
+  // and keeps owner and permissions. kReplaceAll replaces whatever is at the place, also a link or a pipe, which
+  // somebody may have planted there.
+  enum class Existing { kRefuse, kReplace, kReplaceAll };
 
-  // Creates the file, replacing an existing one atomically and keeping its owner and permissions. It is locked until
-  // the writer ends. Writes to the descriptor that /dev/stdout and its like name. Throws a CommandError (kCannotWrite)
-  // if it cannot be created.
-  explicit RecordWriter(std::filesystem::path file, Unfinished unfinished = Unfinished::kRefuse);
+  // Creates the file, which is locked until the writer ends. An existing one is replaced atomically, as soon as the
+  // first event is written. Writes to what is no regular file, and to the descriptor that /dev/stdout and its like
+  // name, as it is. Throws a CommandError (kCannotWrite) if it cannot be created: of several writers of one file, all
+  // but one.
+  explicit RecordWriter(std::filesystem::path file, Existing existing = Existing::kRefuse);
   ~RecordWriter() override;
 
-  // After a failure nothing more is written.
+  // After a failure nothing more is written. Throws a CommandError (kCannotWrite) if a file was to be replaced and the
+  // first event cannot be written; the file is then unchanged.
   void onEvent(const RunEvent& event) override { onEvent(event, recordLine(event, taken_)); }
   // Writes a line that was already formatted. The line of an event is the same in all records of a run.
   void onEvent(const RunEvent& event, const std::string& line);
@@ -45,12 +49,15 @@ class RecordWriter final : public RunEventSink {
 
  private:
   [[noreturn]] void refuse(const std::string& why) const;
-  // Creates the regular file at `target`.
-  void create(const std::filesystem::path& target, Unfinished unfinished);
-  int replace(const std::filesystem::path& target, ReplacementFile& created) const;
+  void create(const std::filesystem::path& target);
+  void createReplacement(const std::filesystem::path& target);
+  bool inheritOld() const;
+  void putInPlace();
   void write(const std::string& line);
 
   const std::filesystem::path file_;
+  std::filesystem::path target_;                // what the replacement will replace
+  std::optional<ReplacementFile> replacement_;  // until it is in place
   int descriptor_ = -1;
   std::uint64_t taken_ = 0;
   std::string problem_;

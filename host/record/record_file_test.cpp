@@ -43,7 +43,7 @@ std::string textOf(const std::vector<std::string>& lines) {
 class RecordFileTest : public testing::Test {
  protected:
   void write(const std::vector<RunEvent>& events) const {
-    RecordWriter writer(file_);
+    RecordWriter writer(file_, RecordWriter::Existing::kReplace);
     for (const RunEvent& event : events) writer.onEvent(event);
     EXPECT_EQ(writer.problem(), "");
   }
@@ -212,11 +212,12 @@ TEST_F(RecordFileTest, WritesNoEventThatCouldNotBeReadBack) {
 
 TEST_F(RecordFileTest, RefusesARecordThatAnotherWriterHasNotFinished) {
   const auto refusalOfWriter = [](const fs::path& file) {
-    return refusalOf(ExitCode::kCannotWrite, [&] { const RecordWriter second(file); });
+    return refusalOf(ExitCode::kCannotWrite,
+                     [&] { const RecordWriter second(file, RecordWriter::Existing::kReplace); });
   };
   fs::create_symlink("record", directory_.path() / "link");
   for (int i = 0; i < 2; ++i) {  // a new file, then one that is replaced
-    RecordWriter first(file_);
+    RecordWriter first(file_, i == 0 ? RecordWriter::Existing::kRefuse : RecordWriter::Existing::kReplace);
     first.onEvent(runOf({}));
     const std::string before = directory_.read("record");
     EXPECT_EQ(refusalOfWriter(file_),
@@ -227,10 +228,37 @@ TEST_F(RecordFileTest, RefusesARecordThatAnotherWriterHasNotFinished) {
     EXPECT_THAT(directory_.read("record"), StartsWith(before));
     EXPECT_EQ(std::distance(fs::directory_iterator(directory_.path()), fs::directory_iterator()), 2);
   }
-  RecordWriter first(file_);
-  RecordWriter second(file_, RecordWriter::Unfinished::kReplace);
+  RecordWriter first(file_, RecordWriter::Existing::kReplace);
   first.onEvent(runOf({}));
+  RecordWriter second(file_, RecordWriter::Existing::kReplaceAll);
+  first.onEvent(RunEnded{std::nullopt, momentAt(1)});
   EXPECT_EQ(directory_.read("record"), "");
+}
+
+TEST_F(RecordFileTest, RefusesAFileThatIsThere) {
+  const auto refusalOfFile = [](const fs::path& file) {
+    return refusalOf(ExitCode::kCannotWrite, [&] { const RecordWriter writer(file); });
+  };
+  directory_.write("record", "old");
+  fs::create_symlink("record", directory_.path() / "link");
+  fs::create_symlink("nowhere", directory_.path() / "dangling");
+  for (const char* name : {"record", "link", "dangling"}) {
+    EXPECT_THAT(refusalOfFile(directory_.path() / name),
+                HasSubstr("cannot be written: it exists already; replace it with --replace"));
+  }
+  EXPECT_EQ(directory_.read("record"), "old");
+  EXPECT_EQ(std::distance(fs::directory_iterator(directory_.path()), fs::directory_iterator()), 3);
+}
+
+TEST_F(RecordFileTest, KeepsAnOldFileUntilTheFirstEventIsWritten) {
+  directory_.write("record", "old");
+  { const RecordWriter writer(file_, RecordWriter::Existing::kReplace); }
+  EXPECT_EQ(directory_.read("record"), "old");
+  RecordWriter writer(file_, RecordWriter::Existing::kReplace);
+  RunStarted tooLong = runOf({});
+  tooLong.phone = std::string(kMaxLine, 'x');
+  EXPECT_THAT(refusalOf(ExitCode::kCannotWrite, [&] { writer.onEvent(tooLong); }), HasSubstr("more than 64 MiB"));
+  EXPECT_EQ(directory_.read("record"), "old");
 }
 
 TEST_F(RecordFileTest, RefusesWhatIsNoRecord) {
@@ -261,8 +289,9 @@ TEST_F(RecordFileTest, RefusesWhatCannotBeRead) {
 TEST_F(RecordFileTest, TakesThePlaceOfAnOldFileAtOnce) {
   directory_.write("record", "old");
   const int old = ::open(file_.c_str(), O_RDONLY);
-  const RecordWriter writer(file_);
-  EXPECT_EQ(directory_.read("record"), "");
+  RecordWriter writer(file_, RecordWriter::Existing::kReplace);
+  writer.onEvent(runOf({}));
+  EXPECT_EQ(directory_.read("record"), recordLine(runOf({}), 0));
   char text[4] = {};
   EXPECT_EQ(::read(old, text, sizeof text), 3);  // readers of the old file are not affected
   ::close(old);
@@ -288,7 +317,8 @@ TEST_F(RecordFileTest, DoesNotTakeARecordFromAnotherUser) {
   write(wholeRun());
   ASSERT_EQ(::chmod(directory_.path().c_str(), 0777), 0);
   ASSERT_EQ(::seteuid(54'321), 0);
-  const std::string refusal = refusalOf(ExitCode::kCannotWrite, [&] { const RecordWriter writer(file_); });
+  const std::string refusal =
+      refusalOf(ExitCode::kCannotWrite, [&] { const RecordWriter writer(file_, RecordWriter::Existing::kReplace); });
   ASSERT_EQ(::seteuid(0), 0);
   EXPECT_THAT(refusal,
               testing::EndsWith("cannot be written: it belongs to another user; remove it first, or name another "
@@ -298,7 +328,7 @@ TEST_F(RecordFileTest, DoesNotTakeARecordFromAnotherUser) {
 
 TEST_F(RecordFileTest, ReplacesWhateverSomebodyPlantedWhereItMay) {
   const auto replaceIt = [this] {
-    RecordWriter writer(file_, RecordWriter::Unfinished::kReplace);
+    RecordWriter writer(file_, RecordWriter::Existing::kReplaceAll);
     writer.onEvent(runOf({}));
   };
   directory_.write("precious", "precious");
@@ -358,7 +388,7 @@ TEST_F(RecordFileTest, RefusesAFileThatCannotBeMade) {
   EXPECT_THAT(refusalOfFile(directory_.path() / "nowhere" / "x"),
               HasSubstr("cannot be written: No such file or directory"));
   EXPECT_THAT(refusalOfFile(directory_.write("file", "") / "x"), HasSubstr("cannot be written: Not a directory"));
-  EXPECT_THAT(refusalOfFile(directory_.path() / std::string(250, 'x')), HasSubstr("File name too long"));
+  EXPECT_THAT(refusalOfFile(directory_.path() / std::string(256, 'x')), HasSubstr("File name too long"));
   fs::create_symlink("itself", directory_.path() / "itself");
   EXPECT_THAT(refusalOfFile(directory_.path() / "itself" / "x"), HasSubstr("Too many levels of symbolic links"));
 }

@@ -3,6 +3,7 @@
 #include "host/device/phone.h"
 #include "host/error/host_error.h"
 #include "host/record/previous_run.h"
+#include "host/text/table.h"
 #include "host/text/timestamp.h"
 
 #include <chrono>
@@ -21,7 +22,7 @@ std::unique_ptr<RecordWriter> lastRunRecord() {
   std::error_code ignored;
   std::filesystem::create_directories(file.parent_path(), ignored);
   try {
-    return std::make_unique<RecordWriter>(file, RecordWriter::Unfinished::kReplace);  // the last run to begin counts
+    return std::make_unique<RecordWriter>(file, RecordWriter::Existing::kReplaceAll);  // the last run to begin counts
   } catch (const CommandError&) {
     return nullptr;
   }
@@ -34,8 +35,15 @@ std::string problemOf(const RecordWriter& record) {
 }  // namespace
 
 EventPipeline::EventPipeline(const EventPipelineOptions& options, Console& console)
-    : logLimit_(options.logLimit), logCap_(options.logLimit), report_(options.report, console) {
-  if (!options.record.empty()) records_.push_back(std::make_unique<RecordWriter>(options.record));
+    : console_(console),
+      tellsRecord_(options.tellsRecord),
+      logLimit_(options.logLimit),
+      logCap_(options.logLimit),
+      report_(options.report, console) {
+  if (!options.record.empty()) {
+    const auto existing = options.replacesRecord ? RecordWriter::Existing::kReplace : RecordWriter::Existing::kRefuse;
+    records_.push_back(std::make_unique<RecordWriter>(options.record, existing));
+  }
   required_ = records_.size();
   if (options.keepsLastRun) {
     if (std::unique_ptr<RecordWriter> last = lastRunRecord()) records_.push_back(std::move(last));
@@ -68,7 +76,16 @@ void EventPipeline::pass(const RunEvent& event) {
   }
   report_.onEvent(event);
   if (std::holds_alternative<DiagnosticEnded>(event)) report_.addRecord(builder_.takeRecord());
-  if (std::holds_alternative<RunEnded>(event)) ended_ = true;
+  if (std::holds_alternative<RunEnded>(event)) {
+    ended_ = true;
+    if (tellsRecord_) tellRecord();
+  }
+}
+
+void EventPipeline::tellRecord() {
+  const RecordWriter& record = *records_.front();
+  if (record.problem().empty())
+    console_.err << "Recorded in " << printable(record.file().string()) << '\n' << std::flush;
 }
 
 void EventPipeline::endDiagnostic() {

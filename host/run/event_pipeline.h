@@ -21,6 +21,8 @@ namespace quazor {
 // The destinations of a run's events.
 struct EventPipelineOptions {
   std::filesystem::path record;  // empty: none
+  bool replacesRecord = false;   // an existing one
+  bool tellsRecord = false;      // its file is told at the end of the run
   bool keepsLastRun = false;
   bool systemLog = false;
   ReportOptions report;
@@ -57,9 +59,12 @@ class EventPipeline final : public RunEventSink {
   // True for a log line beyond the limit.
   bool isLeftOut(const RunEvent& event);
   void pass(const RunEvent& event);
+  void tellRecord();
   void endOpenDiagnostic();
   void interruptRun();
 
+  Console& console_;
+  const bool tellsRecord_;
   std::vector<std::unique_ptr<RecordWriter>> records_;
   std::size_t required_ = 0;  // the number of records that the user requested; they come first
   std::uint64_t recorded_ = 0;

@@ -24,7 +24,10 @@ using testing::IsEmpty;
 
 class EventPipelineTest : public testing::Test {
  protected:
-  EventPipelineTest() { options_.record = record_; }
+  EventPipelineTest() {
+    options_.record = record_;
+    options_.replacesRecord = true;
+  }
 
   static void takeAll(EventPipeline& events, const std::vector<RunEvent>& some) {
     for (const RunEvent& event : some) events.onEvent(event);
