@@ -3,8 +3,8 @@
 #include "host/command/commands.h"
 #include "host/error/exit_code.h"
 #include "host/system/capabilities.h"
-#include "host/system/file_size_limit.h"
 #include "host/system/standard_descriptors.h"
+#include "host/system/write_signals.h"
 
 #include <langinfo.h>
 #include <locale.h>
@@ -42,7 +42,7 @@ int main(int argc, char** argv) {
   try {
     quazor::dropCapabilities();
     quazor::openStandardDescriptors();
-    quazor::failWritesBeyondFileSizeLimit();
+    quazor::failWritesWithoutSignals();
     quazor::Console console{std::cout, std::cerr, wantsColour(), isatty(STDERR_FILENO) == 1, writesUtf8()};
     const std::vector<std::string> arguments(argv + (argc > 0 ? 1 : 0), argv + argc);
     return static_cast<int>(quazor::runProgram(arguments, quazor::Installation::ofThisProgram(), console));

@@ -2,6 +2,7 @@
 
 import fcntl
 import json
+import os
 import pathlib
 import subprocess
 import unittest
@@ -123,6 +124,20 @@ class OutputFilesTest(CommandLineTest):
                 self.assert_refused(self.run_fake("--record", self.record, option), 73, why)
             self.assertEqual(self.record.read_bytes(), self.before[self.record])
         self.assertEqual(self.run_fake("--record", self.record, "--replace").returncode, 0)
+
+    def test_a_standard_output_that_nobody_reads_any_more(self):
+        report = self.directory / "report.json"
+        for arguments in ([], ["--verbose"], ["--format", "csv"], ["--in-process"]):
+            with self.subTest(arguments):
+                read, write = os.pipe()
+                os.close(read)
+                result = self.run_fake("--output", f"json:{report}", *arguments, names=["Fake.*"], stdout=write)
+                os.close(write)
+                self.assertEqual(result.returncode, 73, result.stderr)
+                self.assertIn("quazor: standard output cannot be written\n", result.stderr)
+                names = [one["name"] for one in json.loads(report.read_text())["diagnostics"]]
+                self.assertEqual(names, ["Fake.One", "Fake.Two"])
+                report.unlink()
 
     def test_a_format_that_is_none(self):
         result = self.run_fake("--output", "xml:report", cwd=self.directory)

@@ -77,12 +77,6 @@ OrderedMap<Counts> countsOf(const std::vector<SelftestRow>& rows, const std::vec
   return all;
 }
 
-std::size_t phonesIn(const std::vector<SelftestRow>& rows) {
-  OrderedMap<bool> phones;
-  for (const SelftestRow& row : rows) phones.set(row.scenario, true);
-  return phones.size();
-}
-
 }  // namespace
 
 std::string_view nameOf(SelftestVerdict verdict) {
@@ -151,24 +145,32 @@ bool allPassed(const std::vector<SelftestVerdict>& verdicts) {
   });
 }
 
-void printSelftest(std::ostream& out, const std::vector<SelftestRow>& rows, std::uint64_t seeds) {
+void printSelftest(std::ostream& out, const SelftestOutcome& outcome) {
   using Align = Table::Align;
+  const std::vector<SelftestRow>& rows = outcome.rows;
   const std::vector<SelftestVerdict> verdicts = verdictsOf(rows);
-  Table table({Align::kLeft, Align::kLeft, Align::kLeft, Align::kRight, Align::kLeft});
-  table.addRow({"Phone", "Run", "Expected", "As expected", "Outcome"});
-  for (std::size_t i = 0; i < rows.size(); ++i) {
-    const SelftestRow& row = rows[i];
-    table.addRow({printable(row.scenario), printable(row.expected.name), row.expected.verdict,
-                  formatMessage("%@ of %@", row.asExpected, row.runs), std::string(nameOf(verdicts[i]))});
-  }
-  table.print(out, "");
-  for (std::size_t i = 0; i < rows.size(); ++i) {
-    if (rows[i].difference.empty()) continue;
-    out << '\n'
-        << printable(rows[i].scenario) << ", " << printable(rows[i].expected.name) << ": "
-        << printable(rows[i].difference) << '\n';
-  }
+  printDetections(out, outcome.phones);
   out << '\n';
+  Table others({Align::kLeft, Align::kLeft, Align::kLeft, Align::kRight, Align::kLeft});
+  others.addRow({"Phone", "Run", "Expected", "As expected", "Outcome"});
+  std::size_t differing = 0;
+  for (std::size_t i = 0; i < rows.size(); ++i) {
+    if (allPassed({verdicts[i]})) continue;
+    ++differing;
+    const SelftestRow& row = rows[i];
+    others.addRow({printable(row.scenario), printable(row.expected.name), row.expected.verdict,
+                   formatMessage("%@ of %@", row.asExpected, row.runs), std::string(nameOf(verdicts[i]))});
+  }
+  if (differing > 0) {
+    out << "Not as the phone expects:\n";
+    others.print(out, "  ");
+    for (const SelftestRow& row : rows) {
+      if (row.difference.empty()) continue;
+      out << "  " << printable(row.scenario) << ", " << printable(row.expected.name) << ": "
+          << printable(row.difference) << '\n';
+    }
+    out << '\n';
+  }
   Table matrix({Align::kLeft, Align::kRight, Align::kRight, Align::kRight});
   matrix.addRow({"Run", "Detected", "False alarms", "Invalid"});
   for (const auto& [name, counts] : countsOf(rows, verdicts)) {
@@ -176,28 +178,46 @@ void printSelftest(std::ostream& out, const std::vector<SelftestRow>& rows, std:
                    formatMessage("%@ of %@", counts.falseAlarms, counts.healthy), std::to_string(counts.invalid)});
   }
   matrix.print(out, "");
-  out << formatMessage("\nPhones: %@, runs: %@, seeds of each: %@; %@\n", phonesIn(rows), rows.size(), seeds,
-                       allPassed(verdicts) ? "all as expected" : "NOT all as expected");
+  const DetectionTotals totals = totalsOf(outcome.phones);
+  out << formatMessage("\nPhones: %@ with a fault, %@ healthy; runs: %@, seeds of each: %@\n", totals.faulty,
+                       totals.healthy, rows.size(), outcome.seeds);
+  printTotals(out, totals);
+  if (differing == 0) {
+    out << "Every run ended as its phone expects.\n";
+  } else {
+    out << formatMessage("NOT as the phone expects: %@ of %@ runs\n", differing, rows.size());
+  }
+  if (!outcome.isComplete()) {
+    out << formatMessage("Interrupted: %@ of %@ phones were run.\n", outcome.phones.size(), outcome.wanted);
+  }
 }
 
-Json selftestDocument(const std::vector<SelftestRow>& rows, std::uint64_t seeds) {
+Json selftestDocument(const SelftestOutcome& outcome) {
+  const std::vector<SelftestRow>& rows = outcome.rows;
   const std::vector<SelftestVerdict> verdicts = verdictsOf(rows);
   Json json = Json::array();
   for (std::size_t i = 0; i < rows.size(); ++i) {
     const SelftestRow& row = rows[i];
-    std::string outcome(nameOf(verdicts[i]));
-    std::transform(outcome.begin(), outcome.end(), outcome.begin(),
+    std::string verdict(nameOf(verdicts[i]));
+    std::transform(verdict.begin(), verdict.end(), verdict.begin(),
                    [](char unit) { return unit >= 'A' && unit <= 'Z' ? static_cast<char>(unit - 'A' + 'a') : unit; });
     json.push_back({{"phone", row.scenario},
                     {"name", row.expected.name},
                     {"expected", row.expected.verdict},
                     {"runs", row.runs},
                     {"asExpected", row.asExpected},
-                    {"outcome", outcome},
+                    {"outcome", verdict},
                     {"difference", row.difference.empty() ? Json() : Json(row.difference)},
                     {"faultsFired", row.faultsFired}});
   }
-  return {{"schema", 1}, {"seeds", seeds}, {"allAsExpected", allPassed(verdicts)}, {"rows", std::move(json)}};
+  return {{"schema", 1},
+          {"seeds", outcome.seeds},
+          {"allAsExpected", allPassed(verdicts)},
+          {"interrupted", !outcome.isComplete()},
+          {"phonesWanted", outcome.wanted},
+          {"totals", totalsJson(totalsOf(outcome.phones))},
+          {"phones", detectionsJson(outcome.phones)},
+          {"rows", std::move(json)}};
 }
 
 }  // namespace quazor

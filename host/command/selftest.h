@@ -1,6 +1,7 @@
 // The self-test: checks that the diagnostics find the faults of a phone and raise no false alarms.
 #pragma once
 
+#include "host/command/detection.h"
 #include "host/device/phone.h"
 #include "host/model/diagnostic_record.h"
 
@@ -44,8 +45,18 @@ std::vector<SelftestVerdict> verdictsOf(const std::vector<SelftestRow>& rows);
 // True if every row is kPassed or kDetected.
 bool allPassed(const std::vector<SelftestVerdict>& verdicts);
 
-// Prints a line per row, then per diagnostic the number of detected faults and of false alarms.
-void printSelftest(std::ostream& out, const std::vector<SelftestRow>& rows, std::uint64_t seeds);
-nlohmann::ordered_json selftestDocument(const std::vector<SelftestRow>& rows, std::uint64_t seeds);
+struct SelftestOutcome {
+  std::vector<SelftestRow> rows;
+  std::vector<PhoneDetection> phones;
+  std::uint64_t seeds = 0;
+  std::size_t wanted = 0;  // the number of phones to run, which is greater than that of `phones` after an interrupt
+
+  bool isComplete() const { return phones.size() == wanted; }
+};
+
+// Prints the matrix of detection, the rows that did not end as expected, per diagnostic the number of detected faults
+// and of false alarms, and the totals.
+void printSelftest(std::ostream& out, const SelftestOutcome& outcome);
+nlohmann::ordered_json selftestDocument(const SelftestOutcome& outcome);
 
 }  // namespace quazor

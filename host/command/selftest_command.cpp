@@ -4,11 +4,17 @@
 #include "contract/message_format.h"
 #include "host/command/selection.h"
 #include "host/command/selftest.h"
+#include "host/model/judge.h"
+#include "host/model/limit_check.h"
 #include "host/model/record_builder.h"
 #include "host/record/value_json.h"
+#include "host/text/table.h"
 #include "host/text/timestamp.h"
 
 #include <algorithm>
+#include <deque>
+#include <iterator>
+#include <optional>
 #include <sstream>
 #include <utility>
 
@@ -36,6 +42,51 @@ std::vector<std::string> wantedScenarios(const Options& options, const Installat
   return wanted;
 }
 
+constexpr const char* kStrict = "strict";  // an installed profile
+
+// The verdict on the run with the limits of the profile in place of its own.
+Verdict verdictWith(DiagnosticRecord record, const Profile& profile) {
+  if (record.verdict == Verdict::kError) return Verdict::kError;
+  record.limits = limitsFor(record.name, profile.limits);
+  return judgeRecord(record, true).verdict;
+}
+
+bool haveSameValues(const ResolvedParameters& a, const ResolvedParameters& b) {
+  const auto isSame = [](const ResolvedParameter& one, const ResolvedParameter& other) {
+    return one.name == other.name && one.value == other.value;
+  };
+  return std::equal(a.experiment.begin(), a.experiment.end(), b.experiment.begin(), b.experiment.end(), isSame) &&
+         std::equal(a.analysis.begin(), a.analysis.end(), b.analysis.begin(), b.analysis.end(), isSame);
+}
+
+// A line on a terminal that is replaced by the next one.
+// Thread: one at a time.
+class StatusLine {
+ public:
+  // `terminal` is borrowed; null shows nothing.
+  explicit StatusLine(std::ostream* terminal) : terminal_(terminal) {}
+  StatusLine(const StatusLine&) = delete;
+  StatusLine& operator=(const StatusLine&) = delete;
+  ~StatusLine() { erase(); }
+
+  void show(const std::string& text) {
+    erase();
+    if (terminal_ == nullptr) return;
+    *terminal_ << text << std::flush;
+    lineIsThere_ = true;
+  }
+
+  void erase() {
+    if (!lineIsThere_) return;
+    *terminal_ << "\r\033[K" << std::flush;
+    lineIsThere_ = false;
+  }
+
+ private:
+  std::ostream* const terminal_;
+  bool lineIsThere_ = false;
+};
+
 class Selftest {
  public:
   // `signals` is null if the diagnostics run in this process.
@@ -45,32 +96,127 @@ class Selftest {
         scan_(scanOf(
             options_, installation, [](const std::vector<Diagnostic>& all) { return all; }, signals)),
         isolation_(withoutFailed(isolationOf(options_, installation), scan_.failed)),
-        progress_(console.showsProgress ? &console.err : nullptr),
+        status_(console.showsProgress ? &console.err : nullptr),
         signals_(signals) {
     profile_ = readProfile(installation.defaultProfile());
+    // Without an installed profile of that name, profile() returns the name itself.
+    const std::filesystem::path strict = installation.profile(kStrict);
+    if (strict != kStrict) strict_ = readProfile(strict);
   }
 
-  std::vector<SelftestRow> perform() {
-    std::vector<SelftestRow> rows;
-    for (const std::string& name : wantedScenarios(options_, installation_)) {
-      const std::filesystem::path file = installation_.scenario(name);
-      for (const ExpectedOutcome& expected : summaryOfScenario(file).expected) {
-        SelftestRow row{name, expected, 0, 0, 0, {}, {}};
-        for (std::uint64_t seed = 0; seed < options_.seeds; ++seed) {
-          count(row, run(file, expected, seed));
-          if (signals_ != nullptr && signals_->requestsToEnd() > 0)
-            throw CommandError(ExitCode::kInterrupted, "interrupted");
-        }
-        rows.push_back(std::move(row));
-      }
+  // Ends at an interrupt; the phone that was running then is left out.
+  SelftestOutcome perform() {
+    SelftestOutcome outcome;
+    const std::vector<std::string> names = wantedScenarios(options_, installation_);
+    outcome.seeds = options_.seeds;
+    for (const std::string& name : names) {
+      const ScenarioSummary summary = summaryOfScenario(installation_.scenario(name));
+      if (summary.expected.empty()) continue;
+      ++outcome.wanted;
     }
-    return rows;
+    for (const std::string& name : names) {
+      showProgress(outcome, name);
+      if (!performPhone(name, outcome)) break;
+    }
+    status_.erase();
+    return outcome;
   }
 
  private:
+  struct HealthyRun {
+    std::string name;
+    DiagnosticRecord record;
+  };
+
   static Options withAllPlugins(Options options, const Installation& installation) {
     if (options.plugins.empty()) options.plugins = installation.allPlugins();
     return options;
+  }
+
+  void showProgress(const SelftestOutcome& outcome, const std::string& name) {
+    status_.show(formatMessage("Selftest: %@ of %@ phones done, now %@", outcome.phones.size(), outcome.wanted,
+                               printable(name)));
+  }
+
+  bool isInterrupted() const { return signals_ != nullptr && signals_->requestsToEnd() > 0; }
+
+  // Adds the rows of the phone and its detection. Returns false if it was interrupted; then it adds nothing.
+  bool performPhone(const std::string& name, SelftestOutcome& outcome) {
+    const std::filesystem::path file = installation_.scenario(name);
+    const ScenarioSummary summary = summaryOfScenario(file);
+    if (summary.expected.empty()) return true;
+    PhoneDetection phone{name, summary.title, file == installation_.defaultScenario(), false, {}, {}, {}};
+    std::vector<SelftestRow> rows;
+    for (const ExpectedOutcome& expected : summary.expected) {
+      rows.push_back({name, expected, 0, 0, 0, {}, {}});
+      if (expected.verdict != nameOf(Verdict::kPass)) phone.isExpected = true;
+    }
+    if (strict_) phone.byStrict.emplace();
+    std::vector<DiagnosticRecord> passed;  // with the first seed
+    for (std::uint64_t seed = 0; seed < options_.seeds; ++seed) {
+      bool found = false;
+      bool foundByStrict = false;
+      for (SelftestRow& row : rows) {
+        DiagnosticRecord record = run(file, row.expected, seed, profile_);
+        if (isInterrupted()) return false;
+        count(row, record);
+        if (record.verdict != Verdict::kPass) found = true;
+        if (strict_ && strictVerdict(file, row.expected, record) != Verdict::kPass) foundByStrict = true;
+        if (isInterrupted()) return false;
+        if (seed == 0) passed.push_back(std::move(record));
+      }
+      add(phone.byDefault, found);
+      if (phone.byStrict) add(*phone.byStrict, foundByStrict);
+    }
+    if (!phone.healthy && !phone.byDefault.isComplete()) {
+      phone.reasons = reasonsOf(rows, passed, phone.byDefault);
+      if (isInterrupted()) return false;
+    }
+    outcome.phones.push_back(std::move(phone));
+    std::move(rows.begin(), rows.end(), std::back_inserter(outcome.rows));
+    return true;
+  }
+
+  static void add(Detection& detection, bool found) {
+    ++detection.seeds;
+    if (found) ++detection.found;
+  }
+
+  // The verdict with the profile strict. A run whose parameters it does not change is only judged again.
+  Verdict strictVerdict(const std::filesystem::path& file, const ExpectedOutcome& expected,
+                        const DiagnosticRecord& record) {
+    if (expected.experimentOnly) return record.verdict;
+    if (haveSameValues(parametersOf(find(expected), expected, *strict_), record.parameters)) {
+      return verdictWith(record, *strict_);
+    }
+    return verdictWith(run(file, expected, record.seed, *strict_), *strict_);
+  }
+
+  // Why the runs of a phone with a fault passed.
+  std::vector<std::string> reasonsOf(const std::vector<SelftestRow>& rows, const std::vector<DiagnosticRecord>& records,
+                                     const Detection& detection) {
+    if (detection.found > 0) return {"whether it is detected depends on the order of simultaneous events"};
+    std::vector<std::string> reasons;
+    for (std::size_t i = 0; i < rows.size(); ++i) {
+      const DiagnosticRecord* const healthy = healthyRun(rows[i].expected);
+      if (healthy == nullptr) return {"there is no healthy phone to compare it with"};
+      for (std::string& one : undetectedChanges(*healthy, records[i])) reasons.push_back(std::move(one));
+    }
+    if (reasons.empty()) reasons.emplace_back("it changes nothing that is measured or logged");
+    return reasons;
+  }
+
+  // The same run, with the first seed, on the healthy phone; null if there is none. Each is run once.
+  const DiagnosticRecord* healthyRun(const ExpectedOutcome& expected) {
+    const std::filesystem::path file = installation_.defaultScenario();
+    if (!std::filesystem::exists(file)) return nullptr;
+    for (const HealthyRun& one : healthyRuns_) {
+      if (one.name == expected.name &&
+          haveSameValues(one.record.parameters, parametersOf(find(expected), expected, profile_)))
+        return &one.record;
+    }
+    healthyRuns_.push_back({expected.name, run(file, expected, 0, profile_)});
+    return &healthyRuns_.back().record;
   }
 
   static void count(SelftestRow& row, const DiagnosticRecord& record) {
@@ -94,8 +240,9 @@ class Selftest {
     throw CommandError(ExitCode::kCannotRead, "a phone expects " + expected.name + ", but no loaded plug-in has it");
   }
 
-  ResolvedParameters parametersOf(const DescribedDiagnostic& described, const ExpectedOutcome& expected) const {
-    if (!expected.experimentOnly) return resolveParameters(described, {profile_}, {});
+  static ResolvedParameters parametersOf(const DescribedDiagnostic& described, const ExpectedOutcome& expected,
+                                         const Profile& profile) {
+    if (!expected.experimentOnly) return resolveParameters(described, {profile}, {});
     std::vector<ParameterOverride> settings;
     for (const auto& [name, value] : expected.parameters) {
       // Formats the value like on a command line, where a whole number is an integer.
@@ -104,23 +251,22 @@ class Selftest {
     return resolveParameters(described, {}, settings);
   }
 
-  DiagnosticRecord run(const std::filesystem::path& file, const ExpectedOutcome& expected, std::uint64_t seed) {
+  DiagnosticRecord run(const std::filesystem::path& file, const ExpectedOutcome& expected, std::uint64_t seed,
+                       const Profile& profile) {
     const DescribedDiagnostic& described = find(expected);
     const Diagnostic& diagnostic = described.diagnostic;
-    const ResolvedParameters parameters = parametersOf(described, expected);
+    const ResolvedParameters parameters = parametersOf(described, expected, profile);
     RunOptions runOptions;
     runOptions.makePhone = phonesOfScenario(file, false, seed);
     runOptions.logLevel = LogLevel::kError;
     RecordBuilder builder;
     builder.onEvent(DiagnosticStarted{diagnostic.name, described.summary(), diagnostic.experimentName,
                                       diagnostic.analysisName, diagnostic.experimentOnly, parameters, seed, dateNow()});
-    progress_.start(file.stem().string(), {});
     if (signals_ == nullptr) {
       runDiagnostic(diagnostic, parameters, runOptions, builder);
     } else {
-      runIsolated(isolation_, *signals_, diagnostic, parameters, runOptions, nullptr, progress_, builder);
+      runIsolated(isolation_, *signals_, diagnostic, parameters, runOptions, nullptr, noProgress_, builder);
     }
-    progress_.stop();
     for (const RunEvent& event : builder.ending(dateNow())) builder.onEvent(event);
     return builder.takeRecord();
   }
@@ -129,25 +275,35 @@ class Selftest {
   const Installation& installation_;
   const PluginScan scan_;
   const IsolationOptions isolation_;
-  Progress progress_;
+  Progress noProgress_{nullptr};  // of single runs
+  StatusLine status_;
   Profile profile_;
+  std::optional<Profile> strict_;
   WatchedSignals* const signals_;
+  std::deque<HealthyRun> healthyRuns_;  // a growing deque does not move them
 };
 
 }  // namespace
 
 ExitCode selftestCommand(const Options& options, const Installation& installation, Console& console,
                          WatchedSignals* signals) {
-  const std::vector<SelftestRow> rows = Selftest(options, installation, console, signals).perform();
-  if (rows.empty()) throw CommandError(ExitCode::kCannotRead, "nothing was tested: no phone has an expected outcome");
+  const SelftestOutcome outcome = Selftest(options, installation, console, signals).perform();
+  if (outcome.rows.empty()) {
+    if (!outcome.isComplete()) throw CommandError(ExitCode::kInterrupted, "interrupted before any phone was tested");
+    throw CommandError(ExitCode::kCannotRead, "nothing was tested: no phone has an expected outcome");
+  }
   std::ostringstream text;
   if (options.report.format == Format::kJson) {
-    text << documentText(selftestDocument(rows, options.seeds));
+    text << documentText(selftestDocument(outcome));
   } else {
-    printSelftest(text, rows, options.seeds);
+    printSelftest(text, outcome);
   }
   writeOutput(options.report, console, text.str());
-  return allPassed(verdictsOf(rows)) ? ExitCode::kAllPassed : ExitCode::kFailed;
+  if (!outcome.isComplete()) {
+    throw CommandError(ExitCode::kInterrupted,
+                       formatMessage("interrupted: %@ of %@ phones were run", outcome.phones.size(), outcome.wanted));
+  }
+  return allPassed(verdictsOf(outcome.rows)) ? ExitCode::kAllPassed : ExitCode::kFailed;
 }
 
 }  // namespace quazor

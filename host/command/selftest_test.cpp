@@ -101,33 +101,66 @@ TEST(SelftestVerdicts, CountThePhonesFaultsInAllOfItsRowsTogether) {
               testing::ElementsAre(SelftestVerdict::kDetected, SelftestVerdict::kPassed, SelftestVerdict::kInvalid));
 }
 
-TEST(Selftest, PrintsEveryRowAndTheMatrix) {
-  const std::vector<SelftestRow> rows = {row("healthy", passes(), 3, 3, {}), row("faulty", errs(), 3, 0, {1}),
-                                         row("missed", errs(), 2, 1, {3})};
+SelftestOutcome outcomeOf(std::vector<SelftestRow> rows) {
+  SelftestOutcome outcome;
+  outcome.seeds = 3;
+  for (const SelftestRow& one : rows) {
+    const bool healthy = one.scenario == "healthy";
+    outcome.phones.push_back({one.scenario, "", healthy, !healthy, {3, 3 - one.passes}, {}, {}});
+  }
+  outcome.rows = std::move(rows);
+  outcome.wanted = outcome.phones.size();
+  return outcome;
+}
+
+TEST(Selftest, PrintsTheMatrixAndWhatIsNotAsExpected) {
   std::ostringstream out;
-  printSelftest(out, rows, 3);
+  printSelftest(out, outcomeOf({row("healthy", passes(), 3, 3, {}), row("faulty", errs(), 3, 0, {1}),
+                                row("missed", errs(), 2, 1, {3})}));
   EXPECT_EQ(out.str(),
-            "Phone    Run   Expected  As expected  Outcome\n"
-            "healthy  Name  pass           3 of 3  passed\n"
-            "faulty   Name  error          3 of 3  detected\n"
-            "missed   Name  error          2 of 3  MISSED\n"
+            "Phone    Expected  By default       By strict\n"
+            "healthy  passed    passed           not installed\n"
+            "faulty   detected  detected         not installed\n"
+            "missed   detected  in 2 of 3 seeds  not installed\n"
             "\n"
-            "missed, Name: it differs\n"
+            "Not detected by default, and why:\n"
+            "\n"
+            "  missed (by strict: not installed)\n"
+            "\n"
+            "Not as the phone expects:\n"
+            "  Phone   Run   Expected  As expected  Outcome\n"
+            "  missed  Name  error          2 of 3  MISSED\n"
+            "  missed, Name: it differs\n"
             "\n"
             "Run   Detected  False alarms  Invalid\n"
             "Name    1 of 2        0 of 1        0\n"
             "\n"
-            "Phones: 3, runs: 3, seeds of each: 3; NOT all as expected\n");
+            "Phones: 2 with a fault, 1 healthy; runs: 3, seeds of each: 3\n"
+            "By default: 1 of 2 faults detected, 1 blind spot, 0 false alarms\n"
+            "NOT as the phone expects: 1 of 3 runs\n");
+}
+
+TEST(Selftest, SaysHowFarItCame) {
+  SelftestOutcome outcome = outcomeOf({row("faulty", errs(), 3, 0, {1})});
+  outcome.wanted = 7;
+  std::ostringstream out;
+  printSelftest(out, outcome);
+  EXPECT_THAT(out.str(), testing::EndsWith("Every run ended as its phone expects.\n"
+                                           "Interrupted: 1 of 7 phones were run.\n"));
+  EXPECT_EQ(selftestDocument(outcome)["interrupted"], true);
+  EXPECT_EQ(selftestDocument(outcome)["phonesWanted"], 7);
 }
 
 TEST(Selftest, IsADocumentToo) {
-  const nlohmann::ordered_json document = selftestDocument({row("missed", errs(), 2, 1, {3})}, 3);
+  const nlohmann::ordered_json document = selftestDocument(outcomeOf({row("missed", errs(), 2, 1, {3})}));
   EXPECT_EQ(document["allAsExpected"], false);
   EXPECT_EQ(document["rows"][0]["outcome"], "missed");
   EXPECT_EQ(document["rows"][0]["difference"], "it differs");
   EXPECT_EQ(document["rows"][0]["faultsFired"][0], 3);
-  EXPECT_EQ(selftestDocument({row("alarm", passes(), 2, 2, {})}, 3)["rows"][0]["outcome"], "false alarm");
-  EXPECT_TRUE(selftestDocument({row("healthy", passes(), 3, 3, {})}, 3)["rows"][0]["difference"].is_null());
+  EXPECT_EQ(document["phones"][0]["default"]["detected"], 2);
+  EXPECT_EQ(document["totals"]["default"]["blindSpots"], 1);
+  EXPECT_EQ(selftestDocument(outcomeOf({row("alarm", passes(), 2, 2, {})}))["rows"][0]["outcome"], "false alarm");
+  EXPECT_TRUE(selftestDocument(outcomeOf({row("healthy", passes(), 3, 3, {})}))["rows"][0]["difference"].is_null());
 }
 
 TEST(SelftestCommand, IsRefusedWhereNothingIsTested) {

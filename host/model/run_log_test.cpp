@@ -41,6 +41,23 @@ TEST(RunLog, DropsWhatIsWrittenAfterItWasClosed) {
   EXPECT_TRUE(events.events.empty());
 }
 
+TEST(RunLog, TakesTheLinesOfAThreadThatBelongsToItOrToNone) {
+  EventList events;
+  RunLog log(std::make_shared<ManualClock>(), events);
+  EventList eventsOfNext;
+  RunLog next(std::make_shared<ManualClock>(), eventsOfNext);
+  {
+    const RunLog::Owner owner(log);
+    log.write(LogLevel::kError, "s", "c", "its own");
+    next.write(LogLevel::kError, "s", "c", "late for its own");
+  }
+  next.write(LogLevel::kError, "s", "c", "of no run");
+  ASSERT_EQ(events.events.size(), 1U);
+  EXPECT_EQ(std::get<Logged>(events.events[0]).line.text, "its own");
+  ASSERT_EQ(eventsOfNext.events.size(), 1U);
+  EXPECT_EQ(std::get<Logged>(eventsOfNext.events[0]).line.text, "of no run");
+}
+
 TEST(LogLevels, HaveNames) {
   EXPECT_EQ(nameOf(LogLevel::kError), "error");
   EXPECT_EQ(nameOf(LogLevel::kDefault), "default");

@@ -20,6 +20,18 @@
 #include <iterator>
 #include <vector>
 
+namespace {
+
+int syncs = 0;
+
+}  // namespace
+
+// Takes the place of the C library's, which has no effect that a test could see.
+extern "C" int fdatasync(int) {
+  ++syncs;
+  return 0;
+}
+
 namespace quazor {
 namespace {
 
@@ -89,6 +101,16 @@ TEST_F(RecordFileTest, HoldsEachEventAsSoonAsItWasTaken) {
   }
 }
 
+TEST_F(RecordFileTest, IsWrittenToTheDiskAtTheEndOfTheRunAndNotBefore) {
+  RecordWriter writer(file_);
+  syncs = 0;
+  for (const RunEvent& event : wholeRun()) {
+    EXPECT_EQ(syncs, 0);
+    writer.onEvent(event);
+  }
+  EXPECT_EQ(syncs, 1);
+}
+
 TEST_F(RecordFileTest, GivesTheWholeLinesOfARecordThatWasCutOffAnywhere) {
   const std::vector<RunEvent> events = {
       runOf({"A\n\u00e4"}), beginningOf("A\n\u00e4"), StageStarted{Stage::kRun, momentAt(2)},
@@ -154,6 +176,7 @@ TEST_F(RecordFileTest, ReadsFormat1) {
   };
   replace(R"("record":2)", R"("record":1)");
   replace(R"(,"limits":[])", "");
+  replace(R"(,"id":"","host":"","tags":[])", "");
   directory_.write("record", text);
   EXPECT_EQ(readRecord(file_).events.size(), wholeRun().size());
   replace(R"("record":1)", R"("record":2)");
@@ -203,10 +226,14 @@ TEST_F(RecordFileTest, ReadsLinesOfAnyLengthUpToTheLimit) {
 }
 
 TEST_F(RecordFileTest, WritesNoEventThatCouldNotBeReadBack) {
-  RecordWriter writer(file_);
-  writer.onEvent(runOf({}));
-  writer.onEvent(AuxiliaryDataAdded{"key", Value(std::string(kMaxLine, 'x'))});
-  EXPECT_EQ(writer.problem(), "an event takes more than 64 MiB");
+  const RunEvent event = AuxiliaryDataAdded{"key", Value("value")};
+  for (const bool tooLong : {false, true}) {
+    RecordWriter writer(file_);
+    writer.onEvent(runOf({}));
+    writer.onEvent(event, std::string(kMaxLine + (tooLong ? 1 : 0), 'x') + "\n");
+    EXPECT_EQ(writer.problem(), tooLong ? "an event takes more than 64 MiB" : "");
+    EXPECT_EQ(directory_.read("record").size() > kMaxLine, !tooLong);
+  }
   EXPECT_EQ(readRecord(file_).events.size(), 1U);
 }
 

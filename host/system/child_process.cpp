@@ -1,6 +1,6 @@
 #include "host/system/child_process.h"
 
-#include "host/system/file_size_limit.h"
+#include "host/system/write_signals.h"
 
 #include <fcntl.h>
 #include <linux/close_range.h>
@@ -78,7 +78,7 @@ int becomeChild(const WatchedSignals& signals, const Pipe& connection, const Pip
     ::setrlimit(RLIMIT_AS, &limit);
   }
   signals.restore();
-  restoreFileSizeSignal();
+  restoreWriteSignals();
   return number;
 }
 

@@ -8,6 +8,7 @@ import resource
 import shutil
 import signal
 import subprocess
+import tempfile
 import time
 
 LISTED_TEST = re.compile(r"^ +Test +#\d+: (\S+)", re.MULTILINE)
@@ -15,7 +16,7 @@ MEMORY = 16 << 30  # a mutant may allocate without end
 FILE_SIZE = 2 << 30
 # Checks of texts of the tree, and tests that take long for what they could detect here.
 NOT_JUDGES = ("include_directions.*|every_test_is_built.*|folders.*|thread_words.*|run_paths.*|check_test|"
-              "headers_stand_alone.*|compile_failure.*|kernel_.*|check_installed|projector_stress_test|mutation_.*|"
+              "headers_stand_alone.*|compile_failure_self_test|kernel_.*|check_installed|projector_stress_test|mutation_.*|"
               "fuzz_.*")
 
 
@@ -42,9 +43,19 @@ class Laboratory:
         self.root = root
         self.source = work / "source"
         self.build = self.source / "build" / "test"  # so that a compiler cache knows the paths
-        self.scratch = work / "scratch"
+        # Tests become other users, who cannot enter a work folder below somebody's home.
+        self.enclosing = tempfile.TemporaryDirectory(prefix="quazor-mutation-")
+        os.chmod(self.enclosing.name, 0o711)
+        self.scratch = pathlib.Path(self.enclosing.name) / "scratch"
+        self.output = work / "output"
         self.jobs = jobs
         self.confine = confine
+
+    def close(self):
+        self.enclosing.cleanup()
+
+    def enclosing_mode(self):
+        return os.stat(self.enclosing.name).st_mode
 
     def update(self):
         """Makes the copy equal to the tree's files, without touching those that are equal."""
@@ -107,8 +118,7 @@ class Laboratory:
             environment["CCACHE_DIR"] = str(pathlib.Path.home() / ".cache" / "ccache")
         if not self.scratch.is_dir():
             self.scratch.mkdir(parents=True)
-        output = self.scratch.with_name("output")
-        with open(output, "wb") as log:
+        with open(self.output, "wb") as log:
             process = subprocess.Popen(command, stdout=log, stderr=subprocess.STDOUT, stdin=subprocess.DEVNULL,
                                        env=environment, start_new_session=True, preexec_fn=limit_resources)
             try:
@@ -119,7 +129,7 @@ class Laboratory:
                 if process.poll() is None:
                     os.killpg(process.pid, signal.SIGKILL)
                     process.wait()
-        return code == 0, output.read_text(encoding="utf-8", errors="replace")
+        return code == 0, self.output.read_text(encoding="utf-8", errors="replace")
 
 
 def seconds_since(begin):

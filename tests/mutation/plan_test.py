@@ -223,6 +223,8 @@ class LaboratoryTest(unittest.TestCase):
         with tempfile.TemporaryDirectory() as folder:
             work = pathlib.Path(folder)
             one = laboratory.Laboratory(work, work, 1, [])
+            self.addCleanup(one.close)
+            self.assertEqual(one.enclosing_mode() & 0o011, 0o011, "tests become other users")
             one.build.mkdir(parents=True)
             (one.build / "CTestTestfile.cmake").write_text("add_test(hangs sleep 100)\n", encoding="utf-8")
             passed, output = one.test("hangs", 1, 60)
@@ -254,6 +256,18 @@ class JudgeTest(unittest.TestCase):
         self.assertEqual(self.judge(fake, 0, 1, folder, mutant), (run.OPEN, ""))
         self.assertEqual(fake.steps, [("make", ("b_test",)), ("test", "^(b_test)$"), ("make", ("a_test",)),
                                       ("test", "^(a_test)$")])
+
+    def test_a_test_that_compiles_its_source_itself_needs_no_build(self):
+        name = plan.COMPILE_FAILURE + "some"
+        fake = FakeLaboratory()
+        judge = run.Judge(fake, {"a_test", name}, {"a_test"})
+        judge.judge(plan.Folder("x", (), ("a_test", name), ()), Mutant("x/a/some.cpp", "", 0, 1, "2", "1", "2"), 0, 1)
+        self.assertEqual(fake.steps, [("make", ("a_test",)), ("test", "^(a_test)$"), ("make", (run.NO_TARGET,)),
+                                      ("test", f"^({name})$")])
+
+    def test_the_compile_failures_of_the_plan_are_those_of_the_tree(self):
+        sources = (plan.root_of_tree() / "tests" / "compile_failures").glob("*.cpp")
+        self.assertEqual(sorted(plan.COMPILE_FAILURES), sorted(plan.COMPILE_FAILURE + one.stem for one in sources))
 
     def test_the_first_failure_kills(self):
         fake = FakeLaboratory(failing="^(a_test)$")

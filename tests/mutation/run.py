@@ -34,6 +34,7 @@ STEPS = 3  # a folder's own tests, those near it, the rest
 LEAST, LEAST_OF_FOLDER = 0.97, 0.95
 OWN_LIMIT, REST_LIMIT = 600, 3000  # seconds for the tests of one step
 OWN_EACH_LIMIT, REST_EACH_LIMIT = 120, 300  # seconds for one test
+NO_TARGET = "build.ninja"  # builds nothing, whereas no target at all builds everything
 ATTEMPTS = 3
 ALL_TESTS = "all tests"  # when the step exceeds its time, but none of its tests does
 BATCH = 10  # of one folder in a row, because a header that changes back is compiled everywhere
@@ -86,8 +87,9 @@ class Judge:
 
     def _step(self, names, each):
         known = [name for name in names if name in self.tests]
-        programs = [name for name in known if name in self.targets]
-        return Step(tuple(programs) if len(programs) == len(known) else (), f"^({'|'.join(known)})$", each, OWN_LIMIT)
+        needed = [name for name in known if not name.startswith(plan.COMPILE_FAILURE)]
+        targets = tuple(name for name in needed if name in self.targets) or (NO_TARGET,)
+        return Step(targets if all(name in self.targets for name in needed) else (), f"^({'|'.join(known)})$", each, OWN_LIMIT)
 
     def _steps(self, folder, mutant):
         """The steps of a judgement, each in parts: the first failure ends it, so what fails most often comes first."""
@@ -276,6 +278,8 @@ def main(arguments):
     except BaselineError as problem:
         print(f"without a mutant:\n{problem}")
         return 3
+    finally:
+        laboratory.close()
     return print_table(root, drawn, share, outcomes)
 
 

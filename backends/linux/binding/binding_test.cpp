@@ -297,6 +297,8 @@ TEST_F(BindingTest, RefusesGroupsThatCannotBe) {
        "F:3: groups.g.master: \"FrontFacingCamera\" is not a camera of the group; did you mean \"BackFacingCamera\"?"},
       {"a description that is no text", withGroup("\"description\": []"),
        "F:3: groups.g.description: must be a non-empty string, not an array."},
+      {"an unknown key, which is told before any value", withGroup(R"("description": [], "masters": 1)"),
+       "F:3: groups.g: unknown key \"masters\"; did you mean \"master\"?"},
       {"no master", withGroup(R"("cameras": ["BackFacingCamera"])"), "F:3: groups.g: the key \"master\" is missing."},
   };
   for (const Refused& row : kRows) EXPECT_EQ(problemOf(row.text), row.problem) << row.what;

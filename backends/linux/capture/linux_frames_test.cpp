@@ -2,6 +2,7 @@
 #include "backends/linux/capture/camera_frames.h"
 #include "backends/linux/capture/linux_capture_for_tests.h"
 #include "backends/linux/video/v4l2_device.h"
+#include "contract/log_channel.h"
 
 #include <cerrno>
 #include <thread>
@@ -14,6 +15,23 @@ using LinuxFramesTest = FakeCamerasTest;
 using namespace std::chrono_literals;
 
 constexpr std::size_t kInfrared = 3;
+
+// Keeps the lines. Thread: any.
+class LogLines final : public LogBackend {
+ public:
+  void write(LogLevel, std::string_view, std::string_view, std::string_view text) override {
+    const std::lock_guard lock(mutex_);
+    lines_.emplace_back(text);
+  }
+  std::vector<std::string> lines() const {
+    const std::lock_guard lock(mutex_);
+    return lines_;
+  }
+
+ private:
+  mutable std::mutex mutex_;
+  std::vector<std::string> lines_;  // guarded by mutex_
+};
 
 TEST_F(LinuxFramesTest, AFrameCarriesItsTimeStampAndItsMetadata) {
   fake.begin(kInfrared, seen.handler());
@@ -89,6 +107,39 @@ TEST(LinuxFramesOwnMachineTest, AMetadataNodeThatFailsLeavesTheCameraStreaming) 
     EXPECT_EQ(fake.counter(kInfrared, "MetadataErrorCount"), atQueue ? 0 : 10);
     EXPECT_EQ(fake.stop(kInfrared), "done");
   }
+}
+
+TEST_F(LinuxFramesTest, AMetadataNodeThatFailsIsToldInTheLog) {
+  const auto log = std::make_shared<LogLines>();
+  sharedLog().setBackend(log, LogLevel::kError);
+  fake.begin(kInfrared, seen.handler());
+  fake.kernel->breakStream(fake.metadataNode);
+  fake.kernel->passTime(100ms);
+  seen.wait(3);
+  EXPECT_EQ(fake.stop(kInfrared), "done");
+  sharedLog().setBackend(nullptr, LogLevel::kError);
+  const std::vector<std::string> want{
+      "FrontFacingInfraredCamera while streaming: LinuxErrorDomain code 1: VIDIOC_DQBUF "
+      "on " +
+      fake.metadataNode + " failed: Input/output error (EIO)"};
+  EXPECT_EQ(log->lines(), want);
+}
+
+TEST_F(LinuxFramesTest, AMetadataNodeThatIsAlwaysReadyDoesNotKeepTheCameraWaiting) {
+  fake.kernel->with(fake.metadataNode, [](FakeNode& node) { return node.mostBuffers = 1; });
+  int dequeued = 0;  // read and written by the thread of the frames
+  int dequeuedBefore = 0;
+  fake.begin(kInfrared, [&](PixelBuffer&, MediaTime) { dequeuedBefore = dequeued; });
+  ASSERT_TRUE(fake.kernel->settle());
+  fake.kernel->beforeCall = [&](unsigned long request) {
+    if (request == VIDIOC_DQBUF && ++dequeued <= 3) fake.kernel->produce(fake.metadataNode);
+  };
+  fake.kernel->passTime(0ms);
+  fake.kernel->produce(fake.nodes[kInfrared]);
+  ASSERT_TRUE(fake.kernel->settle());
+  EXPECT_EQ(fake.stop(kInfrared), "done");
+  fake.kernel->beforeCall = nullptr;
+  EXPECT_EQ(dequeuedBefore, 3) << "one of the metadata, the frame, and the one that is not there yet";
 }
 
 TEST_F(LinuxFramesTest, ABufferThatIsKeptTakesNothingFromTheDriver) {

@@ -54,6 +54,11 @@ TEST_F(LinuxStreamTest, WhatNoVideoNodeCanDoIsRefused) {
             "6 " + name + "MaximumFrameRate must be a number above 0 and at most 10000, not the number 10001.");
 }
 
+TEST_F(LinuxStreamTest, TheLowestRateOfAllIsTaken) {
+  ASSERT_EQ(fake.take(0), "done");
+  EXPECT_EQ(fake.set(fake.wide(), capture_key::MinimumFrameRate, 0.01), "done");
+}
+
 TEST(LinuxStreamOwnMachineTest, AFormatThatIsNotThereOrHasAnotherSizeIsRefused) {
   Binding binding = fakeBinding();
   binding.cameras[1].width = 800;

@@ -110,7 +110,9 @@ class FakeHidrawCalls final : public HidrawCalls {
     if (readErrors.empty()) return ::read(descriptor, room.data(), room.size());
     errno = readErrors.front();
     readErrors.erase(readErrors.begin());
-    return -1;
+    if (errno != 0) return -1;
+    errno = EAGAIN;  // of an earlier call: the end of a file is no error and leaves it
+    return 0;
   }
   int setFeature(int descriptor, std::span<const std::uint8_t> report) override {
     EXPECT_GE(descriptor, 0);
@@ -128,7 +130,7 @@ class FakeHidrawCalls final : public HidrawCalls {
 
   int openError = 0;
   std::function<void()> onOpen;
-  std::vector<int> readErrors;  // of the next reads
+  std::vector<int> readErrors;  // of the next reads; 0 for the end of the file
   int featureInterruptions = 0;
   int featureError = 0;
   std::chrono::nanoseconds featureTime{0};

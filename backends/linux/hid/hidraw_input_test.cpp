@@ -197,6 +197,7 @@ TEST_F(HidrawInputTest, EveryErrorOfAReadEndsTheReportsOnceButForThoseThatSayNot
       {EAGAIN, {"7601, 2", "7602, 2"}},
       {EIO, {kGone}},
       {ENODEV, {kGone}},
+      {0, {kGone}},
       {EFAULT, {"LinuxErrorDomain code 1: read on /dev/hidraw0 failed: Bad address (EFAULT)"}},
   };
   for (const auto& row : kRows) {

@@ -244,6 +244,7 @@ TEST_F(ProbeTest, BindsTheCountersThatThereAre) {
   EXPECT_EQ(binding_.counterFiles[1].group, "net");
   EXPECT_EQ(binding_.counterFiles[3].subgroup, "vmstat");
   ASSERT_EQ(binding_.tracepoints.size(), 1U);
+  EXPECT_EQ(binding_.tracepoints[0].system, "v4l2");
   EXPECT_EQ(binding_.tracepoints[0].event, "v4l2_dqbuf");
 }
 
