@@ -256,7 +256,7 @@ def jobs(bench, is_all):
     for form in ("json", "csv", "junit", "ocp", "text"):
         yield job(output_in, form, "--output", "/dev/full", FULL)
         yield job(output_in, form, "--output", "/nowhere/file", FULL)
-    for target in ("/dev/full", "/nowhere/file", "/", "/proc/version"):
+    for target in ("/dev/full", "/nowhere/file", "/proc", "/proc/version"):
         yield job(output_in, "", "--record", target, FULL)
     for make, name in ((link_as_last_run, "a link for the last run"), (hard_link_as_last_run, "a hard link for the last run"),
                        (directory_as_last_run, "a folder for the last run"), (pipe_as_last_run, "a pipe for the last run"),
