@@ -120,7 +120,7 @@ class Doctor {
     const std::filesystem::path file = previousRunFile();
     if (file.empty()) {
       tell(true, "last run", "-", "not recorded: neither XDG_STATE_HOME nor HOME is set");
-    } else if (!std::filesystem::exists(file)) {
+    } else if (!hasPreviousRun(file)) {
       tell(true, "last run", file.string(), "no run recorded yet");
     } else {
       check("last run", file.string(),

@@ -68,6 +68,17 @@ class DoctorTest(DoctorCase):
         self.assert_refused(self.doctor("--plugin", PLUGINS / "undescribable_plugin.so"), "undescribable_plugin.so",
                             "cannot be described")
 
+    def test_a_place_for_the_last_run_that_leads_nowhere(self):
+        last = self.state / "quazor/last_run.jsonl"
+        last.parent.mkdir(parents=True, exist_ok=True)
+        last.symlink_to(last.name)
+        result = quazor("doctor", env={"XDG_STATE_HOME": str(self.state)})
+        self.assertEqual(result.returncode, 66, result.stderr)
+        self.assertIn("Too many levels of symbolic links", result.stdout)
+        again = quazor("run", "--only", "failed", env={"XDG_STATE_HOME": str(self.state)})
+        self.assertEqual((again.returncode, again.stdout), (66, ""))
+        self.assertIn("cannot be read: Too many levels of symbolic links", again.stderr)
+
     def test_the_record_of_the_last_run(self):
         self.assertEqual(self.run_fake("--set", "minimum=90", "--set", "measured=1",
                                        env={"XDG_STATE_HOME": str(self.state)}).returncode, 1)

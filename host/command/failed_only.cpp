@@ -89,7 +89,7 @@ std::vector<std::filesystem::path> pluginsToLoadAgain(const RecordedRun& run, bo
 
 Options optionsToRunAgain(Options options, const Installation& installation) {
   const std::filesystem::path record = options.failedOf.empty() ? previousRunFile() : options.failedOf;
-  if (record.empty() || (options.failedOf.empty() && !std::filesystem::exists(record))) {
+  if (record.empty() || (options.failedOf.empty() && !hasPreviousRun(record))) {
     throw CommandError(ExitCode::kCannotRead, "no previous run is recorded; use --of RECORD to name a record");
   }
   const RecordedRun run = runIn(record);

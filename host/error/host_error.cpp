@@ -1,5 +1,6 @@
 #include "host/error/host_error.h"
 
+#include <string>
 #include <utility>
 
 namespace quazor {
@@ -13,8 +14,8 @@ DiagnosticErrorPtr errorOfException(std::string_view operation, const std::excep
   try {
     std::rethrow_exception(thrown);
   } catch (const std::exception& exception) {
-    message += " threw an exception: ";
-    message += exception.what();
+    const char* const what = exception.what();
+    message += what == nullptr ? " threw an exception without a text" : std::string(" threw an exception: ") + what;
   } catch (...) {
     message += " threw something that is not a standard exception";
   }

@@ -44,6 +44,17 @@ TEST(CallPlugin, TakesTheErrorThatTheOperationGave) {
   EXPECT_EQ(failure, given);
 }
 
+class Silent : public std::exception {
+  const char* what() const noexcept override { return nullptr; }
+};
+
+TEST(CallPlugin, SurvivesAnExceptionWithoutAText) {
+  DiagnosticErrorPtr failure;
+  EXPECT_FALSE(callPlugin("run of X", &failure, [](DiagnosticErrorPtr*) -> bool { throw Silent(); }));
+  ASSERT_NE(failure, nullptr);
+  EXPECT_EQ(failure->localizedDescription(), "run of X threw an exception without a text");
+}
+
 TEST(CallPlugin, SaysSoWhenTheOperationGaveNone) {
   DiagnosticErrorPtr failure;
   EXPECT_FALSE(callPlugin("run of X", &failure, [](DiagnosticErrorPtr* /*error*/) { return false; }));

@@ -3,12 +3,18 @@
 #include "host/system/user_directory.h"
 
 #include <algorithm>
+#include <system_error>
 
 namespace quazor {
 
 std::filesystem::path previousRunFile() {
   const std::filesystem::path state = userDirectory("XDG_STATE_HOME", ".local/state");
   return state.empty() ? state : state / "last_run.jsonl";
+}
+
+bool hasPreviousRun(const std::filesystem::path& file) {
+  std::error_code error;
+  return std::filesystem::status(file, error).type() != std::filesystem::file_type::not_found;
 }
 
 std::vector<std::string> failedNames(const RecordedRun& run) {

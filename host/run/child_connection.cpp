@@ -28,10 +28,18 @@ std::string secondsText(std::chrono::nanoseconds time) {
 }  // namespace
 
 ConnectionWriter::ConnectionWriter(int descriptor, std::string token)
-    : descriptor_(descriptor), token_(std::move(token)), owner_(::getpid()) {}
+    : descriptor_(descriptor), token_(std::move(token)), owner_(::getpid()) {
+  ::fstat(descriptor_, &connection_);
+}
+
+bool ConnectionWriter::isOverwritten() const {
+  struct stat now {};
+  return ::fstat(descriptor_, &now) != 0 || now.st_dev != connection_.st_dev || now.st_ino != connection_.st_ino;
+}
 
 void ConnectionWriter::say(const Json& json) const {
   if (::getpid() != owner_) ::_exit(EXIT_FAILURE);
+  if (isOverwritten()) ::_exit(kNoConnection);
   const std::string line = token_ + json.dump(-1, ' ', false, Json::error_handler_t::replace) + "\n";
   std::string_view left = line;
   while (!left.empty()) {

@@ -11,6 +11,7 @@
 #include <string>
 #include <string_view>
 
+#include <sys/stat.h>
 #include <sys/types.h>
 
 namespace quazor {
@@ -24,11 +25,15 @@ class ConnectionWriter {
  public:
   ConnectionWriter(int descriptor, std::string token);
 
-  // Ends the process if the connection was closed, or if this is a copy of the process that a plug-in made.
+  // Ends the process if the connection was closed or overwritten, or if this is a copy of the process that a plug-in
+  // made.
   void say(const nlohmann::ordered_json& json) const;
 
  private:
+  bool isOverwritten() const;
+
   const int descriptor_;
+  struct stat connection_ {};
   const std::string token_;
   const pid_t owner_;
 };

@@ -3,6 +3,7 @@
 #include "base/text/input_error.h"
 #include "host/testing/test_signals.h"
 
+#include <fcntl.h>
 #include <gtest/gtest.h>
 #include <sys/wait.h>
 #include <unistd.h>
@@ -51,6 +52,27 @@ TEST(ConnectionWriter, SaysNothingInACopyOfTheProcess) {
               ::waitpid(copy, nullptr, 0);
             }),
             "secret{\"copy\":false}\n");
+}
+
+// Whatever is put in the place of the connection, its owner learns of it, and a write to it ends nobody by a signal.
+TEST(ConnectionWriter, EndsTheProcessWhenTheConnectionIsOverwritten) {
+  const DefaultRequestsToEnd defaults;
+  WatchedSignals signals;
+  const auto body = [](int descriptor) {
+    const ConnectionWriter connection(descriptor, "secret");
+    const int other = ::open("/dev/null", O_WRONLY);
+    ::dup2(other, descriptor);
+    connection.say({{"a", 1}});
+  };
+  ChildProcess child(signals, body, std::nullopt);
+  Supervision supervision;
+  supervision.takeLine = [](std::string_view /*line*/) { return true; };
+  supervision.takeOutput = [](std::string_view /*line*/) {};
+  supervision.deadline = [end = std::chrono::steady_clock::now() + std::chrono::minutes(1)] { return end; };
+  supervision.isDone = [] { return false; };
+  const Supervised end = supervise(child, signals, supervision);
+  EXPECT_EQ(errorOf(end, "the run", {})->localizedDescription(),
+            "the run closed or overwrote its process's connection to quazor");
 }
 
 TEST(DocumentIn, TakesOnlyLinesWithTheToken) {

@@ -129,13 +129,14 @@ class IsolatedRun {
 
   std::string during() const { return formatMessage("the stage %@ of %@", nameOf(order_.stage()), diagnostic_.name); }
 
-  bool isInterrupted() const { return interrupted_.get() != 0; }
+  bool isInterrupted() const { return isInterrupted_; }
 
   // True from the beginning of the setup, which may change the hardware, to that of the teardown, which restores it.
   bool isBeforeTeardown() const { return order_.stage() == Stage::kSetup || order_.stage() == Stage::kRun; }
 
   // Returns true if the child may go on.
   bool interrupt() {
+    isInterrupted_ = true;
     interrupted_.set(1);
     events_.onEvent(Failed{order_.stage(), errorOf({SupervisionEnd::kInterrupted, ProcessEnd()}, during(), {})});
     if (isBeforeTeardown()) {
@@ -164,10 +165,11 @@ class IsolatedRun {
   const Deadlines& deadlines_;
   const std::chrono::nanoseconds grace_;
   const std::string token_;
-  SharedCounter& interrupted_;  // 1 after an interrupt
+  SharedCounter& interrupted_;  // 1 after an interrupt; for the process, which may write anything to it
   Progress& progress_;
   RunEventSink& events_;
   EventOrder order_;
+  bool isInterrupted_ = false;
   Moment deadline_;
   Moment graceEnd_;                  // of the setup or run that was interrupted
   std::chrono::nanoseconds time_{};  // time of the last log line

@@ -410,6 +410,16 @@ TEST_F(SupervisedRunTest, PassesOnlyIfItsProcessEndsWell) {
   }
 }
 
+// A plug-in can write to all the memory of its process, also to what is shared.
+TEST_F(SupervisedRunTest, IsNotInterruptedByWhatItsProcessWritesToTheSharedMemory) {
+  const auto body = [this](RunEventSink& /*events*/) {
+    shared_.interrupted.set(1);
+    std::abort();
+  };
+  EXPECT_THAT(supervised(body), HasSubstr("crashed: its process was terminated by signal 6 (SIGABRT)"));
+  EXPECT_TRUE(goesOn_);
+}
+
 TEST_F(SupervisedRunTest, PassesThoughItIsInterruptedWhileItEnds) {
   const auto body = [parent = ::getpid()](RunEventSink& events) {
     pass(events);

@@ -9,6 +9,7 @@
 #include <gtest/gtest.h>
 #include <poll.h>
 #include <sys/prctl.h>
+#include <sys/ptrace.h>
 #include <sys/resource.h>
 #include <sys/wait.h>
 #include <unistd.h>
@@ -330,6 +331,51 @@ TEST_F(ChildProcessTest, EndsAsWellWhenItsGuardIsStopped) {
     for (int i = 0; i < 60'000 && stateOf(guard) != 'T'; ++i) std::this_thread::sleep_for(1ms);
   }
   EXPECT_EQ(::kill(guard, 0), -1);
+}
+
+// A child can take away from its guard the descriptors that it needs to wait, and to see whom to end.
+TEST_F(ChildProcessTest, LeavesNothingWhenItsGuardMayOpenNoFile) {
+  for (const rlim_t most : {rlim_t{0}, rlim_t{2}}) {
+    pid_t orphan = 0;
+    {
+      const auto body = [most](int connection) {
+        ::prctl(PR_SET_PDEATHSIG, 0);
+        const pid_t other = ::fork();
+        if (other == 0) {
+          ::setsid();
+          hang();
+        }
+        const rlimit few{most, most};
+        if (::prlimit(::getppid(), RLIMIT_NOFILE, &few, nullptr) != 0) ::_exit(1);
+        say(connection, std::to_string(other) + "\n");
+      };
+      ChildProcess child(signals_, body, std::nullopt);
+      std::string text;
+      while (!text.ends_with('\n')) text += readAll(child.connectionDescriptor(), 1);
+      orphan = std::stoi(text);
+      EXPECT_EQ(endOf(child).substr(0, 4), child.hasLostGuard() ? "sign" : "exit");
+    }
+    EXPECT_EQ(::kill(orphan, 0), -1) << most;
+    ::kill(orphan, SIGKILL);
+  }
+}
+
+// A child can make its guard trace it; a stop for the tracer is not an end.
+TEST_F(ChildProcessTest, HasNotEndedWhenItStopsForItsGuard) {
+  const auto goOn = [](int) {
+    ::signal(SIGUSR1, [](int) {});
+    ::ptrace(PTRACE_TRACEME);
+    ::raise(SIGUSR1);
+    ::_exit(7);
+  };
+  ChildProcess goingOn(signals_, goOn, std::nullopt);
+  EXPECT_EQ(endOf(goingOn), "exit code 7");
+  const auto crash = [](int) {
+    ::ptrace(PTRACE_TRACEME);
+    ::raise(SIGSEGV);
+  };
+  ChildProcess crashing(signals_, crash, std::nullopt);
+  EXPECT_EQ(endOf(crashing), "signal 11 (SIGSEGV)");
 }
 
 TEST(ProcessEnds, HaveATextWithTheSignalsName) {

@@ -23,6 +23,9 @@ using SteadyClock = std::chrono::steady_clock;
 // The time limit of a cleanup process.
 constexpr SteadyClock::duration kMaxTidying = 1s;
 
+// A child that no list shows may have come in the meantime, but not so many times.
+constexpr int kMaxBlindRounds = 20;
+
 bool hasChild() {
   siginfo_t info{};
   return ::waitid(P_ALL, 0, &info, WEXITED | WNOHANG | WNOWAIT) == 0;
@@ -77,16 +80,20 @@ std::vector<pid_t> childrenOfThisProcess() {
 
 bool endChildren(const std::vector<pid_t>& others, IsCleanupProcess isCleanupProcess) {
   const SteadyClock::time_point begin = SteadyClock::now();
+  int blindRounds = 0;
   for (;;) {
     bool isLeft = false;
-    for (const pid_t one : childrenOfThisProcess()) {
+    const std::vector<pid_t> children = childrenOfThisProcess();
+    for (const pid_t one : children) {
       if (std::find(others.begin(), others.end(), one) != others.end()) continue;
       const bool isRestoring = isCleanupProcess != nullptr && isCleanupProcess(nameOfProcess(one));
       if (!isRestoring || SteadyClock::now() >= begin + kMaxTidying) ::kill(one, SIGKILL);
       if (::waitpid(one, nullptr, WNOHANG) == 0) isLeft = true;
     }
     // A killed process can leave its own children to this one, so the loop ends only when no child is left.
-    if (!isLeft && childrenOfThisProcess().size() <= others.size()) return true;
+    if (!isLeft && (others.empty() ? !hasChild() : childrenOfThisProcess().size() <= others.size())) return true;
+    // Where no file may be opened, /proc shows no child, though there is one.
+    if (children.empty() && ++blindRounds == kMaxBlindRounds) return false;
     if (SteadyClock::now() >= begin + kMaxEnding) return false;
     std::this_thread::sleep_for(1ms);
   }

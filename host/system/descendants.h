@@ -26,7 +26,8 @@ std::optional<std::vector<pid_t>> childrenOfThreads();
 std::vector<pid_t> childrenByParent();
 
 // Kills and reaps all children of this process except `others`, and then those that it inherits from them as their
-// subreaper. Cleanup processes have one second before they are killed. Returns false if some are left.
+// subreaper. Cleanup processes have one second before they are killed. Returns false if some are left, or if it may not
+// see them.
 bool endChildren(const std::vector<pid_t>& others, IsCleanupProcess isCleanupProcess);
 
 }  // namespace quazor

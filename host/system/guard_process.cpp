@@ -5,6 +5,7 @@
 #include <poll.h>
 #include <signal.h>
 #include <sys/prctl.h>
+#include <sys/ptrace.h>
 #include <sys/signalfd.h>
 #include <sys/socket.h>
 #include <sys/syscall.h>
@@ -13,6 +14,7 @@
 
 #include <cerrno>
 #include <chrono>
+#include <cstdint>
 #include <cstdlib>
 #include <system_error>
 
@@ -35,6 +37,9 @@ struct Message {
   int code = 0;     // si_code and si_status of waitid(2)
   int status = 0;
 };
+
+// True if waitid(2) tells of a stop and not of an end: a process that asked this one to trace it has got a signal.
+bool isTraced(const siginfo_t& info) { return info.si_code == CLD_TRAPPED; }
 
 ProcessEnd endOf(int code, int status) { return {code != CLD_EXITED, status}; }
 
@@ -84,7 +89,7 @@ class Guard {
     for (;;) {
       reap();
       pollfd watched[] = {{channel_, POLLIN, 0}, {children, POLLIN, 0}};
-      ::poll(watched, 2, -1);
+      if (::poll(watched, 2, -1) < 0 && errno != EINTR) ::_exit(EXIT_FAILURE);  // the child took its descriptors away
       if (watched[0].revents != 0) return;
       signalfd_siginfo taken;
       while (::read(children, &taken, sizeof taken) == sizeof taken) {
@@ -98,6 +103,10 @@ class Guard {
     for (;;) {
       siginfo_t info{};
       if (::waitid(P_ALL, 0, &info, WEXITED | WNOHANG | WNOWAIT) != 0 || info.si_pid == 0) return;
+      if (isTraced(info)) {
+        if (::ptrace(PTRACE_DETACH, info.si_pid, nullptr, static_cast<std::intptr_t>(info.si_status)) == 0) continue;
+        return;  // it ends now, and its end is told
+      }
       if (info.si_pid == child_) {
         if (!hasTold_) tell({child_, 0, info.si_code, info.si_status});
         hasTold_ = true;
@@ -208,7 +217,7 @@ const std::optional<ProcessEnd>& GuardProcess::end() {
   }
   siginfo_t info{};
   if (isLost_ && ::waitid(P_PID, static_cast<id_t>(child_), &info, WEXITED | WNOHANG | WNOWAIT) == 0 &&
-      info.si_pid == child_) {
+      info.si_pid == child_ && !isTraced(info)) {
     end_ = endOf(info.si_code, info.si_status);
   }
   return end_;

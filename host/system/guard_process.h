@@ -16,8 +16,8 @@ namespace quazor {
 // of the user may trace it. When this process destroys the object or ends for any reason, the guard kills all of them:
 // nothing that the child does to itself prevents that, unlike PR_SET_PDEATHSIG (prctl(2)).
 //
-// The child can kill the guard. This process then becomes the parent of its processes and kills them itself. For that
-// it must be a subreaper.
+// The child can kill the guard, or leave it no descriptors. This process then becomes the parent of its processes and
+// kills them itself. For that it must be a subreaper.
 //
 // Thread: the one that made it, and no other thread may be there when it is made.
 class GuardProcess {
