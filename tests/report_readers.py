@@ -10,7 +10,8 @@ import json
 import math
 import re
 
-VERDICTS = {("COMPLETE", "PASS"): "pass", ("COMPLETE", "FAIL"): "fail", ("ERROR", "NOT_APPLICABLE"): "error"}
+VERDICTS = {("COMPLETE", "PASS"): "pass", ("COMPLETE", "FAIL"): "fail", ("ERROR", "NOT_APPLICABLE"): "error",
+            ("SKIP", "NOT_APPLICABLE"): "skip"}
 CSV_HEADER = ("diagnostic,verdict,result,value,unit,limit,lower,lowerOpen,upper,upperOpen,resultVerdict,"
               "errorStage,errorDomain,errorCode,errorMessage").split(",")
 
@@ -70,6 +71,12 @@ def limit_of(limit):
     return None if limit is None else Limit(limit["name"], bound(limit["lower"]), bound(limit["upper"]))
 
 
+def skip_of(one):
+    """The kind and the reason, or nothing."""
+    skip = one.get("skip")
+    return None if skip is None else (skip["kind"], skip["reason"])
+
+
 def read_json(text):
     document = json.loads(text)
     of_experiments = "experiments" in document
@@ -80,6 +87,7 @@ def read_json(text):
             "name": one["name"],
             "summary": one["summary"],
             "verdict": one["verdict"],
+            "skip": skip_of(one),
             "results": [
                 Result(each["name"], number(each["value"]), each["unit"], limit_of(each["limit"]), each["verdict"])
                 for each in one.get("measuredResults", [])],
@@ -150,6 +158,7 @@ def read_ocp(stream):
         "verdict": VERDICTS.get((stream.end["status"], stream.end["result"])),
         "results": ocp_results(stream),
         "measurements": [(one["name"][len("raw."):], number(one["value"]), one.get("unit", "")) for one in raw],
+        "skip": skip_of(stream.start["metadata"]),
         "errors": [split_symptom(one) for one in stream.all_of("error")],
         "log": [(levels[one["severity"]], one["message"]) for one in stream.all_of("log")],
         "parameters": {half: {name: number(value) for name, value in parameters.get(half, {}).items()}
@@ -165,6 +174,9 @@ def read_ocp(stream):
 
 def expected_of_ocp(record):
     """After an error the state of the hardware is unknown."""
+    if record["skip"]:
+        kind, reason = record["skip"]
+        return record | {"log": [*record["log"], ("default", f"{kind}: {reason}")]}
     if record["verdict"] != "error":
         return record
     unknown = [one if one.verdict == "none" else one._replace(verdict="unknown") for one in record["results"]]
@@ -192,7 +204,7 @@ def derived_verdict(suite):
         return "error"
     if counts["failures"]:
         return "fail"
-    return "pass" if counts["tests"] > counts["skipped"] else None
+    return "pass" if counts["tests"] > counts["skipped"] else "skip" if properties_of(suite).get("verdict") else None
 
 
 def junit_result(case, verdict_of_suite):
@@ -230,6 +242,8 @@ def read_junit(suite):
         "name": suite.get("name"),
         "summary": it["summary"],
         "verdict": it["verdict"],
+        "skip": next(((one.get("name"), one.find("skipped").get("message")) for one in cases
+                      if one.find("skipped") is not None), None),
         "results": [junit_result(one, it["verdict"]) for one in cases if "value" in properties_of(one)],
         "parameters": {half: {key[len(f"parameter.{half}."):]: number(value) for key, value in it.items()
                               if key.startswith(f"parameter.{half}.")} for half in ("experiment", "analysis")},
@@ -260,6 +274,10 @@ def error_lines(errors, indent):
             for place, one in enumerate(errors)]
 
 
+def skip_lines(skip):
+    return [] if skip is None else [f"    {skip[0]}: {printable(skip[1])}"]
+
+
 def expected_of_junit(record):
     errors = record["errors"]
     lines = "".join(line + "\n" for line in error_lines(errors, ""))
@@ -267,6 +285,7 @@ def expected_of_junit(record):
         "name": in_xml(record["name"]),
         "summary": in_xml(record["summary"]),
         "verdict": record["verdict"],
+        "skip": record["skip"] and (record["skip"][0], in_xml(record["skip"][1])),
         "results": [one._replace(name=in_xml(one.name), unit=in_xml(one.unit),
                                  limit=one.limit and one.limit._replace(name=in_xml(one.limit.name)))
                     for one in record["results"]],
@@ -303,14 +322,16 @@ def read_csv(rows):
         results.append(Result(it["result"], number(it["value"]), it["unit"], Limit(it["limit"], *bounds),
                               it["resultVerdict"]))
     errors = [Error(first["errorDomain"], int(first["errorCode"]), first["errorMessage"])] if first["errorCode"] else []
+    more = rows[0][len(CSV_HEADER):]
     return {"name": first["diagnostic"], "verdict": first["verdict"], "results": results, "errors": errors,
-            "error stage": first["errorStage"]}
+            "error stage": first["errorStage"], "skip": tuple(more) if any(more) else None}
 
 
 def expected_of_csv(record):
     """No limit looks like a limit without name and bounds, and there is only one error."""
     results = [one._replace(limit=one.limit or NO_LIMIT) for one in record["results"]]
-    return {"name": record["name"], "verdict": record["verdict"], "results": results, "errors": record["errors"][:1]}
+    return {"name": record["name"], "verdict": record["verdict"], "results": results, "errors": record["errors"][:1],
+            "skip": record["skip"]}
 
 
 def read_experiment_csv(rows):
@@ -396,7 +417,8 @@ def read_text(lines, expected):
     if expected["auxiliaryData"]:
         lines.block()
     verdict, *errors = lines.block()
-    record["verdict"] = {b"PASS": "pass", b"DONE": "pass", b"FAIL": "fail", b"ERROR": "error"}[verdict[2:]]
+    record["verdict"] = {b"PASS": "pass", b"DONE": "pass", b"FAIL": "fail", b"ERROR": "error",
+                         b"SKIP": "skip"}[verdict[2:]]
     record["errors"] = [line.decode("utf-8", "replace") for line in errors]
     return record
 
@@ -417,5 +439,5 @@ def expected_of_text(record, of_experiments):
         if of_experiments else [],
         "auxiliaryData": of_experiments and record["auxiliaryData"],
         "verdict": record["verdict"],
-        "errors": error_lines(record["errors"], "    "),
+        "errors": error_lines(record["errors"], "    ") or skip_lines(record["skip"]),
     }

@@ -271,6 +271,7 @@ class Generator {
   DiagnosticRecord experiment() {
     DiagnosticRecord record = begun();
     record.experimentOnly = true;
+    if (oneIn(5)) return skipped(std::move(record));
     goThrough(record);
     return ended(std::move(record));
   }
@@ -279,6 +280,7 @@ class Generator {
     DiagnosticRecord record = begun();
     record.analysisName = text();
     record.parameters.analysis = parameters();
+    if (oneIn(5)) return skipped(std::move(record));
     if (goThrough(record)) {
       const bool wild = oneIn(6);
       const bool mayFail = oneIn(3);
@@ -289,8 +291,17 @@ class Generator {
     return ended(std::move(record));
   }
 
-  DiagnosticRecord ended(DiagnosticRecord record) {
-    const RecordJudgement judgement = judgeRecord(record, !oneIn(30));
+  DiagnosticRecord skipped(DiagnosticRecord record) {
+    constexpr SkipKind kKinds[] = {SkipKind::kNoSuchHardware, SkipKind::kNotAllowed, SkipKind::kNotReached};
+    record.faults.clear();
+    record.skip = Skip{oneOf(kKinds), text()};
+    return ended(std::move(record), false);
+  }
+
+  DiagnosticRecord ended(DiagnosticRecord record) { return ended(std::move(record), !oneIn(30)); }
+
+  DiagnosticRecord ended(DiagnosticRecord record, bool completed) {
+    const RecordJudgement judgement = judgeRecord(record, completed);
     record.verdict = judgement.verdict;
     record.error = judgement.error;
     advance();

@@ -28,8 +28,9 @@ FORMS = ("text", "json", "csv", "ocp", "junit")
 INTERRUPTION = report_readers.Error("QuazorHostErrorDomain", 11, "it was interrupted")
 SIGNS = ("]]>", "\ufffd", "\uffff", "\\u0000", "\\r", "\u2028", ",")  # as in JSON
 # The samples must contain some of each.
-KINDS = {"a diagnostic: pass", "a diagnostic: fail", "a diagnostic: error", "an experiment: pass",
-         "an experiment: error", "a run with tags", "a run with a serial number", "an interrupted run without a record", "an interrupted run with a record", "a run that never began",
+KINDS = {"a diagnostic: pass", "a diagnostic: fail", "a diagnostic: error", "a diagnostic: skip", "an experiment: pass",
+         "an experiment: error", "an experiment: skip", "a skip: no-such-hardware", "a skip: not-allowed",
+         "a skip: not-reached", "a run with tags", "a run with a serial number", "an interrupted run without a record", "an interrupted run with a record", "a run that never began",
          "no results", "many results", "a deep error", "a value that is not finite", "a limit without bounds",
          "a result: pass", "a result: fail", "a result: error", "a result: none", *(f"a text with {sign!r}" for sign in SIGNS)}
 
@@ -37,20 +38,24 @@ KINDS = {"a diagnostic: pass", "a diagnostic: fail", "a diagnostic: error", "an 
 def counts_line(records, of_experiments):
     count = collections.Counter(one["verdict"] for one in records)
     many = "" if len(records) == 1 else "s"
+    skipped = f", {count['skip']} skipped" if count["skip"] else ""
     if of_experiments:
-        return f"{len(records)} experiment{many}: {count['pass']} returned a result, {count['error']} ended in an error"
+        return (f"{len(records)} experiment{many}: {count['pass']} returned a result, "
+                f"{count['error']} ended in an error{skipped}")
     return (f"{len(records)} diagnostic{many}: {count['pass']} passed, {count['fail']} failed, "
-            f"{count['error']} ended in an error")
+            f"{count['error']} ended in an error{skipped}")
 
 
 def failure_line(record):
     """The line at the end of a text that says what did not pass."""
-    if record["errors"]:
+    if record["skip"]:
+        what = ": ".join(record["skip"])
+    elif record["errors"]:
         what = f"{record['errors'][0].domain} code {record['errors'][0].code}"
     else:
         names = list(dict.fromkeys(one.name for one in record["results"] if one.verdict == "fail"))
         what = ", ".join(names[:3]) + (f" and {len(names) - 3} more" if len(names) > 3 else "")
-    word = {"fail": "FAIL ", "error": "ERROR"}[record["verdict"]]
+    word = {"fail": "FAIL ", "error": "ERROR", "skip": "SKIP "}[record["verdict"]]
     name = report_readers.printable(record["name"])
     return f"{word} {name}: {report_readers.printable(what)}" if what else f"{word} {name}"
 
@@ -159,7 +164,8 @@ class Comparison:
             expected = [(record["name"], *one) for record in records for one in record["measurements"]]
             self.check(f"{name} csv", report_readers.read_experiment_csv(rows), expected)
             return
-        self.check(f"{name} csv: header", rows.pop(0), report_readers.CSV_HEADER)
+        of_skips = ["skipKind", "skipReason"] if any(one["skip"] for one in records) else []
+        self.check(f"{name} csv: header", rows.pop(0), [*report_readers.CSV_HEADER, *of_skips])
         for place, record in enumerate(records):
             count = max(1, len(record["results"]))
             got = report_readers.read_csv(rows[:count])
@@ -180,6 +186,8 @@ class Comparison:
     def count_kinds(self, of_experiments, records):
         for record in records:
             self.kinds[f"{'an experiment' if of_experiments else 'a diagnostic'}: {record['verdict']}"] += 1
+            if record["skip"]:
+                self.kinds[f"a skip: {record['skip'][0]}"] += 1
             self.kinds["no results"] += not record["results"]
             self.kinds["many results"] += len(record["results"]) > 100
             self.kinds["a deep error"] += len(record["errors"]) > 20

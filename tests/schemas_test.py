@@ -33,6 +33,7 @@ RUNS = (
     ["run", "CameraSyncDiagnostic.*", "--phone", "camera_sync/start_refused_on_first", "--limit", "Nothing > 1"],
     ["run", "CameraSyncDiagnostic.Back", "--limit", "*.Total in [90, 90]"],
     ["experiment", "--all"],
+    ["run", "--all", "--skip", "Tessel*=they are not needed"],
     ["experiment", "NimbeImageExperiment", "--plugin", SENSOR_IMAGES],
     ["experiment", "NimbeImageExperiment", "--plugin", SENSOR_IMAGES, "--phone", "sensor_images/no_sensor"],
 )

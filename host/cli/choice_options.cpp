@@ -1,15 +1,49 @@
 #include "host/cli/choice_options.h"
 
+#include "base/text/utf8.h"
+#include "host/error/exit_code.h"
 #include "host/run/deadlines.h"
 
 #include <CLI/CLI.hpp>
 
+#include <cstddef>
+
 namespace quazor {
+
+namespace {
+
+SkipRule parseSkip(const std::string& text) {
+  const auto refuse = [&text](const std::string& why) {
+    throw CommandError(ExitCode::kUsage, "--skip '" + text + "': " + why);
+  };
+  const std::size_t equals = text.find('=');
+  if (equals == std::string::npos) refuse("expected PATTERN=REASON");
+  SkipRule rule{text.substr(0, equals), {SkipKind::kNotAllowed, text.substr(equals + 1)}};
+  if (rule.pattern.empty()) refuse("the pattern is empty");
+  if (rule.skip.reason.empty()) refuse("the reason is empty");
+  if (findInvalidUtf8(text)) refuse("the text is not valid UTF-8");
+  return rule;
+}
+
+}  // namespace
 
 void addChoiceOptions(CLI::App& command, ChoiceTexts& texts, const std::string& what) {
   command.add_option("--except", texts.except, "Leave out the " + what + " with this name or pattern; repeatable")
       ->allow_extra_args(false)
       ->type_name("PATTERN");
+  command
+      .add_option("--skip", texts.skips,
+                  "Skip the " + what + " with this name or pattern, and report this reason; repeatable")
+      ->allow_extra_args(false)
+      ->type_name("PATTERN=REASON");
+  command.add_flag("--allow-skips", texts.allowSkips,
+                   "Exit with 0 if some of the " + what + " were skipped and the others passed");
+  command
+      .add_option("--stop-on", texts.stopOn,
+                  "Stop after the first error (error), or after the first failure or error (fail); the remaining " +
+                      what + " are skipped")
+      ->type_name("fail|error")
+      ->check(CLI::IsMember({"fail", "error"}));
   command
       .add_option("--settle", texts.settle,
                   "Wait this long between two " + what +
@@ -21,6 +55,9 @@ Choice choiceOf(const ChoiceTexts& texts) {
   Choice choice;
   choice.except = texts.except;
   if (!texts.settle.empty()) choice.settle = parseSettle(texts.settle);
+  for (const std::string& text : texts.skips) choice.skips.push_back(parseSkip(text));
+  if (!texts.stopOn.empty()) choice.stopOn = texts.stopOn == "fail" ? StopOn::kFail : StopOn::kError;
+  choice.allowSkips = texts.allowSkips;
   return choice;
 }
 

@@ -1,6 +1,8 @@
 // The options that choose which diagnostics run, when a run stops, and how often it is repeated.
 #pragma once
 
+#include "host/device/skip.h"
+
 #include <chrono>
 #include <string>
 #include <vector>
@@ -11,15 +13,24 @@ class App;
 
 namespace quazor {
 
+// After which verdict a run stops.
+enum class StopOn { kNothing, kError, kFail };
+
 struct Choice {
   std::vector<std::string> except;    // names or patterns of what is left out
+  std::vector<SkipRule> skips;        // of the command line
   std::chrono::nanoseconds settle{};  // between two diagnostics
+  StopOn stopOn = StopOn::kNothing;
+  bool allowSkips = false;
 };
 
 // The arguments, before they are checked.
 struct ChoiceTexts {
   std::vector<std::string> except;
+  std::vector<std::string> skips;
   std::string settle;
+  std::string stopOn;
+  bool allowSkips = false;
 };
 
 // Declares the options of a command that runs diagnostics or experiments.

@@ -85,7 +85,7 @@ void removeMarks(RawOptions& raw) {
   };
   for (std::vector<std::string>* texts :
        {&raw.names, &raw.plugins, &raw.settings, &raw.limits, &raw.tags, &raw.parameterFiles, &raw.records,
-        &raw.outputs, &raw.deadlines, &raw.choice.except}) {
+        &raw.outputs, &raw.deadlines, &raw.choice.except, &raw.choice.skips}) {
     std::for_each(texts->begin(), texts->end(), removeMark);
   }
   for (std::string* text : {&raw.profile, &raw.phone, &raw.record, &raw.of, &raw.seed, &raw.seeds, &raw.memory,
@@ -278,7 +278,7 @@ void checkNames(const Options& options, const std::string& what) {
 
 Options optionsOf(const CLI::App& command, const RawOptions& raw) {
   for (const char* option : {"--plugin", "--output", "--profile", "--parameters", "--phone", "--record", "--of",
-                             "RECORD", "--memory", "--log-limit", "--grace", "--settle", "--except"}) {
+                             "RECORD", "--memory", "--log-limit", "--grace", "--settle", "--except", "--skip"}) {
     refuseEmpty(command, option);
   }
   Options options;
@@ -312,6 +312,7 @@ Options optionsOf(const CLI::App& command, const RawOptions& raw) {
   const bool isOfRun = options.command == Command::kRun || options.command == Command::kExperiment ||
                        options.command == Command::kAnalyze;
   options.report = reportOf(raw, isOfRun);
+  options.report.exitRules.allowSkips = options.choice.allowSkips;
   options.report.text.verbose = raw.verbose;
   options.report.shownLog = options.logLevel.value_or(LogLevel::kError);
   options.withoutProfile = raw.profile == "none";

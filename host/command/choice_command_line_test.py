@@ -29,6 +29,32 @@ class ChoiceTest(CommandLineTest):
             with self.subTest(pattern=pattern):
                 self.assert_refused(self.run_fake("--except", pattern, "--output", self.output), 64, text)
 
+    def test_all_runs_the_others_without_a_required_parameter(self):
+        record = self.directory / "record.jsonl"
+        for names in (("--all",), ("Fake.*", "Broken.Factory")):
+            with self.subTest(names=names):
+                done = self.run_fake("--format", "json", "--record", record, "--replace", names=names, duration=None)
+                self.assertEqual(done.returncode, 2, done.stderr)
+                found = {one["name"]: one for one in json.loads(done.stdout)["diagnostics"]}
+                error = found["Fake.One"]["error"]
+                self.assertEqual((error["domain"], error["code"]), ("QuazorHostErrorDomain", 16))
+                self.assertIn("Fake.One requires the parameter experiment.duration", error["message"])
+                self.assertIn("Broken.Factory", found)
+                self.assert_verifies(record)
+                self.assert_untouched(record, "Fake.One")
+
+    def assert_untouched(self, record, name):
+        events = events_in(record)
+        begin = [event.get("name") for event in events].index(name)
+        self.assertEqual([event["event"] for event in events[begin:begin + 3]],
+                         ["diagnosticBegan", "failed", "diagnosticEnded"])
+
+    def test_a_named_diagnostic_without_a_required_parameter_is_refused(self):
+        for names in (("Fake.One",), ("Fake.*", "Fake.One")):
+            with self.subTest(names=names):
+                done = self.run_fake("--output", self.output, names=names, duration=None)
+                self.assert_refused(done, 64, "Fake.One requires the parameter experiment.duration")
+
     def test_list_shows_what_the_patterns_fit(self):
         def listed(*names):
             done = quazor("list", *names, "--plugin", WORKING, "--format", "json")

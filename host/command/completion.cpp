@@ -73,6 +73,7 @@ class Completer {
       for (const Stage stage : kStages) stages.push_back(std::string(nameOf(stage)) + "=");
       return stages;
     }
+    if (option == "--stop-on") return {"fail", "error"};
     if (option == "--except") return operands();
     return option == "--set" ? parameters() : std::vector<std::string>();
   }

@@ -1,6 +1,7 @@
 #include "host/command/commands.h"
 
 #include "contract/contract.h"
+#include "host/command/conductor.h"
 #include "host/command/explanations.h"
 #include "host/command/failed_only.h"
 #include "host/command/output_check.h"
@@ -22,73 +23,11 @@
 #include <chrono>
 #include <memory>
 #include <optional>
-#include <thread>
 #include <utility>
 
 namespace quazor {
 
 namespace {
-
-// A diagnostic to run or analyze.
-struct Job {
-  ResolvedDiagnostic bound;
-  const QZExperimentResult* result = nullptr;  // the result to analyze; null: run the experiment
-  std::uint64_t seed = 0;
-};
-
-// Performs the jobs in order, each in a separate process or all in this one.
-class Conductor {
- public:
-  // `signals` is null if the jobs are performed in this process.
-  Conductor(IsolationOptions isolation, RunOptions runOptions, WatchedSignals* signals, EventPipeline& events)
-      : isolation_(std::move(isolation)), runOptions_(std::move(runOptions)), signals_(signals), events_(events) {}
-
-  bool isInterrupted() const { return signals_ != nullptr && signals_->requestsToEnd() > 0; }
-
-  // Waits between two jobs, or until the user interrupts.
-  void settle(std::chrono::nanoseconds time) const {
-    if (signals_ == nullptr) {
-      std::this_thread::sleep_for(time);  // an interrupt ends the process
-    } else {
-      signals_->wait(time);
-    }
-  }
-
-  // Returns the diagnostic that the user interrupted, as in RunEnded; nothing if the run continues.
-  std::optional<std::string> perform(const Job& job) {
-    const auto& [diagnostic, description] = job.bound.described;
-    events_.onEvent(DiagnosticStarted{diagnostic.name, job.bound.described.summary(), diagnostic.experimentName,
-                                      diagnostic.analysisName, diagnostic.experimentOnly, job.bound.parameters,
-                                      job.seed, dateNow()});
-    std::optional<std::string> interrupted;
-    if (description.error != nullptr) {
-      events_.onEvent(Failed{Stage::kDescribe, description.error});
-    } else if (signals_ == nullptr) {
-      performHere(job);
-    } else if (!runIsolated(isolation_, *signals_, diagnostic, job.bound.parameters, runOptions_, job.result,
-                            events_.progress(), events_)) {
-      interrupted = diagnostic.name;
-    }
-    events_.endDiagnostic();
-    if (!interrupted && isInterrupted()) interrupted = "";  // the interrupt came after the end of the diagnostic
-    return interrupted;
-  }
-
- private:
-  void performHere(const Job& job) {
-    const Diagnostic& diagnostic = job.bound.described.diagnostic;
-    if (job.result != nullptr) {
-      analyzeResult(diagnostic, job.bound.parameters, *job.result, runOptions_.logLevel, events_);
-    } else {
-      runDiagnostic(diagnostic, job.bound.parameters, runOptions_, events_);
-    }
-  }
-
-  const IsolationOptions isolation_;
-  const RunOptions runOptions_;
-  WatchedSignals* const signals_;
-  EventPipeline& events_;
-};
 
 // Reports a plug-in that could not be loaded like a diagnostic.
 void tellFailedPlugin(const FailedPlugin& plugin, EventPipeline& events) {
@@ -163,18 +102,9 @@ ExitCode perform(const Options& options, const Installation& installation, Conso
     return ExitCode::kInterrupted;
   }
   const std::chrono::nanoseconds settle = realSettleOf(options);
-  bool isFirst = true;
-  for (const Job& job : jobs) {
-    std::optional<std::string> interrupted;
-    if (!std::exchange(isFirst, false) && settle.count() > 0) {
-      conductor.settle(settle);
-      if (conductor.isInterrupted()) interrupted = "";
-    }
-    if (!interrupted) interrupted = conductor.perform(job);
-    if (interrupted) {
-      events.onEvent(RunEnded{std::move(interrupted), dateNow()});
-      return ExitCode::kInterrupted;
-    }
+  if (std::optional<std::string> interrupted = conductor.performAll(jobs, options.choice.stopOn, settle)) {
+    events.onEvent(RunEnded{std::move(interrupted), dateNow()});
+    return ExitCode::kInterrupted;
   }
   for (const UserLimit& limit : limitsWithoutResult(limits, events.records())) tellLimitWithoutResult(limit, events);
   events.onEvent(RunEnded{std::nullopt, dateNow()});
@@ -195,17 +125,56 @@ ExitCode performNothing(const Options& options, const Installation& installation
   return events->exitCode();
 }
 
-// Returns the name of the selected phone, as records have it.
-std::string choosePhone(const Options& options, const Installation& installation, PhoneMaker* makePhone) {
+// The first rule of the command line, or else of the phone, that fits the diagnostic.
+std::optional<Skip> skipOf(const std::string& diagnostic, const std::vector<SkipRule>& ofCommandLine,
+                           const std::vector<SkipRule>& ofPhone) {
+  for (const std::vector<SkipRule>* const rules : {&ofCommandLine, &ofPhone}) {
+    for (const SkipRule& rule : *rules) {
+      if (matchesName(rule.pattern, diagnostic)) return rule.skip;
+    }
+  }
+  return std::nullopt;
+}
+
+// A plug-in that could not be loaded may have what the pattern fits.
+void refuseUnusedSkips(const std::vector<SkipRule>& rules, const Selection& selection) {
+  for (const SkipRule& rule : rules) {
+    const bool fits = std::any_of(
+        selection.diagnostics.begin(), selection.diagnostics.end(),
+        [&rule](const ResolvedDiagnostic& one) { return matchesName(rule.pattern, one.described.diagnostic.name); });
+    if (fits || !selection.failed.empty()) continue;
+    throw CommandError(ExitCode::kUsage, "--skip '" + rule.pattern + "' fits nothing of what is selected to run");
+  }
+}
+
+// The error of a diagnostic that lacks a required parameter, or null. Throws a CommandError (kUsage) instead for one
+// that the user named: the others are not worth running without it.
+DiagnosticErrorPtr missingParameter(const ResolvedDiagnostic& one, const Options& options) {
+  const std::string problem = missingParameterOf(one.described, one.parameters);
+  if (problem.empty()) return nullptr;
+  const std::string& name = one.described.diagnostic.name;
+  const bool isNamed = std::find(options.names.begin(), options.names.end(), name) != options.names.end();
+  if (isNamed) throw CommandError(ExitCode::kUsage, problem);
+  return hostError(HostErrorCode::kParameterMissing, problem);
+}
+
+// The selected phone.
+struct ChosenPhone {
+  std::string name;  // as records have it
+  PhoneMaker make;
+  std::vector<SkipRule> absent;
+};
+
+ChosenPhone choosePhone(const Options& options, const Installation& installation) {
   if (const auto binding = bindingNamed(options.phone)) {
     const std::filesystem::path file = installation.binding(*binding);
-    *makePhone = phonesOfBinding(file);
-    return std::string(kLinuxPrefix) + file.string();
+    return {std::string(kLinuxPrefix) + file.string(), phonesOfBinding(file), absentOnBinding(file)};
   }
   const std::filesystem::path scenario =
       options.phone.empty() ? installation.defaultScenario() : installation.scenario(options.phone);
-  *makePhone = phonesOfScenario(scenario, options.realTime, options.seed, installation.scenarioSource());
-  return scenario.string();
+  const ScenarioSource source = installation.scenarioSource();
+  return {scenario.string(), phonesOfScenario(scenario, options.realTime, options.seed, source),
+          absentOnScenario(scenario, source)};
 }
 
 }  // namespace
@@ -214,17 +183,20 @@ ExitCode runCommand(const Options& given, const Installation& installation, Cons
   const Options options = given.onlyFailed ? optionsToRunAgain(given, installation) : given;
   if (options.onlyFailed && options.names.empty()) return performNothing(options, installation, console);
   Selection selection = select(options, installation, signals);
+  refuseUnusedSkips(options.choice.skips, selection);
+  const ChosenPhone phone = choosePhone(options, installation);
   std::vector<Job> jobs;
   for (ResolvedDiagnostic& one : selection.diagnostics) {
-    requireParameters(one.described, one.parameters);
-    jobs.push_back({std::move(one), nullptr, options.seed});
+    std::optional<Skip> skip = skipOf(one.described.diagnostic.name, options.choice.skips, phone.absent);
+    DiagnosticErrorPtr problem = skip ? nullptr : missingParameter(one, options);
+    jobs.push_back({std::move(one), nullptr, options.seed, std::move(skip), std::move(problem)});
   }
   RunOptions runOptions;
-  const std::string phone = choosePhone(options, installation, &runOptions.makePhone);
+  runOptions.makePhone = phone.make;
   runOptions.logLevel = options.logLevel.value_or(LogLevel::kDefault);
   runOptions.logLimit = options.logLimit;
   RunStarted began = beginningOf(options, installation, jobs, selection.failed);
-  began.phone = phone;
+  began.phone = phone.name;
   began.limits = std::move(selection.limits);
   return perform(options, installation, console, std::move(began), jobs, selection.failed, runOptions, signals);
 }

@@ -62,16 +62,29 @@ auto read(Read&& readIt, const std::filesystem::path& file) {
   }
 }
 
-// The contents of a scenario file: the phone and the expected outcomes.
+// The contents of a scenario file: the phone, the expected outcomes and what cannot run.
 struct ScenarioFile {
   Scenario scenario;
   std::vector<ExpectedOutcome> expected;
+  std::vector<SkipRule> absent;
 };
 
 ScenarioFile readScenarioFile(const std::filesystem::path& file, const ScenarioSource& find) {
   Scenario scenario = readScenario(file, find);
   std::vector<ExpectedOutcome> expected = readExpectedOutcomes(JsonCursor(*scenario.document));
-  return {std::move(scenario), std::move(expected)};
+  std::vector<SkipRule> absent = readAbsent(JsonCursor(*scenario.document));
+  return {std::move(scenario), std::move(expected), std::move(absent)};
+}
+
+struct BindingFile {
+  Binding binding;
+  std::vector<SkipRule> absent;
+};
+
+BindingFile readBindingFile(const std::filesystem::path& file) {
+  Binding binding = readBinding(file);
+  const JsonDocument document = JsonDocument::read(file);
+  return {std::move(binding), readAbsent(JsonCursor(document))};
 }
 
 }  // namespace
@@ -92,8 +105,15 @@ std::optional<std::filesystem::path> bindingNamed(const std::filesystem::path& p
 }
 
 PhoneMaker phonesOfBinding(const std::filesystem::path& file) {
-  return [binding = read(readBinding, file)] { return std::make_unique<PhoneOfBinding>(binding); };
+  return [binding = read(readBindingFile, file).binding] { return std::make_unique<PhoneOfBinding>(binding); };
 }
+
+std::vector<SkipRule> absentOnScenario(const std::filesystem::path& file, const ScenarioSource& find) {
+  const auto readIt = [&find](const std::filesystem::path& one) { return readScenarioFile(one, find); };
+  return read(readIt, file).absent;
+}
+
+std::vector<SkipRule> absentOnBinding(const std::filesystem::path& file) { return read(readBindingFile, file).absent; }
 
 PhoneProbe probeThisMachine() {
   MachineProbe probe = probeMachine(sourcesOfRunningSystem());

@@ -3,6 +3,7 @@
 
 #include "contract/log_channel.h"
 #include "host/device/expected_outcome.h"
+#include "host/device/skip.h"
 #include "platform/platform.h"
 
 #include <nlohmann/json.hpp>
@@ -50,6 +51,10 @@ using ScenarioSource = std::function<std::filesystem::path(const std::filesystem
 // if the file cannot be read.
 PhoneMaker phonesOfScenario(const std::filesystem::path& file, bool realTime, std::uint64_t seed,
                             const ScenarioSource& find = nullptr);
+
+// What the phone of a scenario or binding file cannot run. Throws like phonesOfScenario.
+std::vector<SkipRule> absentOnScenario(const std::filesystem::path& file, const ScenarioSource& find = nullptr);
+std::vector<SkipRule> absentOnBinding(const std::filesystem::path& file);
 
 struct ScenarioSummary {
   std::string title;

@@ -32,6 +32,7 @@ enum class HostErrorCode : std::int64_t {
   kTooDeep = 13,             // the plug-in gave a value that is nested too deeply to be recorded
   kLimitWithoutResult = 14,  // a user-defined limit fits no result of the run
   kPluginRefused = 15,       // a file in a folder of plug-ins was refused, so none of its code ran or counts
+  kParameterMissing = 16,    // a required parameter has no value
 };
 
 DiagnosticErrorPtr hostError(HostErrorCode code, std::string message);

@@ -45,6 +45,7 @@ struct DiagnosticRecord {
   std::vector<JudgedResult> measuredResults;
   OrderedMap<Measurement> measurements;
   Dictionary auxiliaryData;
+  std::optional<Skip> skip;         // why it was not run; set exactly when the verdict is kSkip
   DiagnosticErrorPtr error;         // the first one; set exactly when the verdict is kError
   std::optional<Stage> errorStage;  // the stage that failed; nothing if the results could not be judged
   std::vector<LogLine> log;

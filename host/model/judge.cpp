@@ -76,6 +76,7 @@ std::string_view nameOf(Verdict verdict) {
   switch (verdict) {
     case Verdict::kPass: return "pass";
     case Verdict::kFail: return "fail";
+    case Verdict::kSkip: return "skip";
     case Verdict::kError: break;
   }
   return "error";
@@ -111,8 +112,14 @@ Judgement judge(const std::vector<JudgedResult>& results) {
   return judgement;
 }
 
+bool isUntouched(const DiagnosticRecord& record) {
+  return record.error == nullptr && record.stages.empty() && record.measurements.empty() &&
+         record.auxiliaryData.empty() && record.measuredResults.empty() && record.faults.empty();
+}
+
 RecordJudgement judgeRecord(const DiagnosticRecord& record, bool completed) {
   if (record.error != nullptr) return {Verdict::kError, record.error};
+  if (record.skip && !completed && isUntouched(record)) return {Verdict::kSkip, nullptr};
   if (!completed) {
     return {Verdict::kError, hostError(HostErrorCode::kConnectionLost, "the run was not completed")};
   }

@@ -17,10 +17,11 @@ struct DiagnosticRecord;
 enum class ResultVerdict { kPass, kFail, kError, kNone };
 
 // kFail means that the hardware is faulty; kError means that the state of the hardware is unknown.
-enum class Verdict { kPass, kFail, kError };
+// kSkip means that it was not run.
+enum class Verdict { kPass, kFail, kError, kSkip };
 
 std::string_view nameOf(ResultVerdict verdict);  // "pass", "fail", "error", "none"
-std::string_view nameOf(Verdict verdict);        // "pass", "fail", "error"
+std::string_view nameOf(Verdict verdict);        // "pass", "fail", "error", "skip"
 
 // A measured result and its verdict.
 struct JudgedResult {
@@ -46,6 +47,9 @@ struct Judgement {
 // kError if nothing was measured or a result cannot be judged; otherwise kFail if a result fails, else kPass.
 Judgement judge(const std::vector<JudgedResult>& results);
 
+// True if the record has neither an error nor anything that a plug-in did.
+bool isUntouched(const DiagnosticRecord& record);
+
 struct RecordJudgement {
   Verdict verdict = Verdict::kError;
   DiagnosticErrorPtr error;  // set exactly when the verdict is kError: the record's own, or the judge's
@@ -54,6 +58,8 @@ struct RecordJudgement {
 // kError if the run had an error, the plug-in's part was not completed, or the results cannot be judged or compared
 // with the user's limits; otherwise what the results and these limits say. An experiment that runs alone is kPass if it
 // was completed without an error: it is not judged.
+//
+// kSkip if the diagnostic was skipped and nothing of it was begun.
 //
 // The verdict that the record holds does not count.
 RecordJudgement judgeRecord(const DiagnosticRecord& record, bool completed);

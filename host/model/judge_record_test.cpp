@@ -155,5 +155,36 @@ TEST(JudgeRecord, AgreesWithTheOracleOnWhateverAPluginTells) {
             << " error\n";
 }
 
+// Wherever it stands, a skip changes no verdict of what was run.
+TEST(JudgeRecord, TakesNothingForSkippedThatWasRun) {
+  constexpr int kSequences = 20'000;
+  RandomEvents random(2);
+  RandomValues places(3);
+  int skips = 0;
+  for (int i = 0; i < kSequences; ++i) {
+    Told told;
+    std::vector<RunEvent> events = random.sequence(&told);
+    const std::size_t place = 1 + places.below(events.size());
+    events.insert(events.begin() + static_cast<std::ptrdiff_t>(place), DiagnosticSkipped{{SkipKind::kNotAllowed, "r"}});
+    RecordBuilder builder;
+    for (const RunEvent& event : events) builder.onEvent(event);
+    for (RunEvent& event : builder.ending(momentAt(9))) events.push_back(std::move(event));
+    for (const RunEvent& event : events) builder.onEvent(event);
+    const Verdict due = oracleVerdict(told.results, told.hasError, told.completed);
+    const Verdict verdict = builder.record().verdict;
+    ASSERT_EQ(builder.record().skip.has_value(), verdict == Verdict::kSkip) << i;
+    events.insert(events.begin(), runOf({"A"}));
+    if (verdict == Verdict::kSkip) {
+      ASSERT_TRUE(told.results.empty() && !told.hasError && !told.completed) << i;
+      ASSERT_TRUE(problemsOf(events).empty()) << i << ": " << problemsOf(events)[0];
+      ++skips;
+    } else {
+      ASSERT_EQ(verdict, due) << i;
+    }
+  }
+  EXPECT_GT(skips, 100);
+  EXPECT_LT(skips, kSequences / 2);
+}
+
 }  // namespace
 }  // namespace quazor

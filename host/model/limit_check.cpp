@@ -162,11 +162,11 @@ std::vector<UserLimit> limitsWithoutResult(const std::vector<UserLimit>& limits,
   std::vector<UserLimit> without;
   for (const UserLimit& limit : limits) {
     bool isMeant = false;
-    bool isDecided = false;  // it fits, or an error is the reason why it does not
+    bool isDecided = false;  // it fits, or an error or a skip is the reason why it does not
     for (const DiagnosticRecord& record : records) {
       if (!appliesTo(limit, record.name) || isOfLimit(record)) continue;
       isMeant = true;
-      isDecided = isDecided || record.error != nullptr || fitsAny(limit, record);
+      isDecided = isDecided || record.error != nullptr || record.skip.has_value() || fitsAny(limit, record);
     }
     if (!isDecided && (isMeant || !limit.onlyIfSelected)) without.push_back(limit);
   }

@@ -78,10 +78,13 @@ void RecordBuilder::fold(const Failed& event) {
 
 void RecordBuilder::fold(const FaultsCounted& event) { record_.faults = event.faults; }
 
+void RecordBuilder::fold(const DiagnosticSkipped& event) { record_.skip = event.skip; }
+
 void RecordBuilder::fold(const DiagnosticCompleted& /*event*/) { completed_ = true; }
 
 void RecordBuilder::fold(const DiagnosticEnded& event) {
   record_.verdict = event.verdict;
+  if (event.verdict != Verdict::kSkip) record_.skip.reset();  // something went wrong besides
   record_.end = event.date;
   open_ = false;
 }

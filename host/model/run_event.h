@@ -83,6 +83,11 @@ struct FaultsCounted {
   std::vector<DeclaredFault> faults;
 };
 
+// The diagnostic that has begun is not run. Only its end follows.
+struct DiagnosticSkipped {
+  Skip skip;
+};
+
 // The plug-in has finished; only the host sends further events of this diagnostic.
 struct DiagnosticCompleted {};
 
@@ -96,9 +101,9 @@ struct RunEnded {
   Date date{};
 };
 
-using RunEvent =
-    std::variant<RunStarted, DiagnosticStarted, StageStarted, StageEnded, Logged, MeasurementsAdded, AuxiliaryDataAdded,
-                 ResultsReported, Failed, FaultsCounted, DiagnosticCompleted, DiagnosticEnded, RunEnded>;
+using RunEvent = std::variant<RunStarted, DiagnosticStarted, StageStarted, StageEnded, Logged, MeasurementsAdded,
+                              AuxiliaryDataAdded, ResultsReported, Failed, FaultsCounted, DiagnosticSkipped,
+                              DiagnosticCompleted, DiagnosticEnded, RunEnded>;
 
 // Receives the events of a run, in order.
 // Thread: one at a time.

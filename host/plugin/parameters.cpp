@@ -255,17 +255,17 @@ ResolvedParameters resolveParameters(const DescribedDiagnostic& diagnostic, cons
           resolvePart(diagnostic, Part::kAnalysis, profiles, settings)};
 }
 
-void requireParameters(const DescribedDiagnostic& diagnostic, const ResolvedParameters& parameters) {
+std::string missingParameterOf(const DescribedDiagnostic& diagnostic, const ResolvedParameters& parameters) {
   for (const Part part : kParts) {
     for (const ResolvedParameter& one : parameters.of(part)) {
       if (one.value || !one.declaration.required()) continue;
       const std::string name =
           diagnostic.diagnostic.experimentOnly ? one.name : formatMessage("%@.%@", nameOf(part), one.name);
-      throw CommandError(ExitCode::kUsage,
-                         formatMessage("%@ requires the parameter %@; set it with --set %@=VALUE or in a profile",
-                                       diagnostic.diagnostic.name, name, name));
+      return formatMessage("%@ requires the parameter %@; set it with --set %@=VALUE or in a profile",
+                           diagnostic.diagnostic.name, name, name);
     }
   }
+  return {};
 }
 
 }  // namespace quazor

@@ -90,7 +90,7 @@ struct ResolvedDiagnostic {
   ResolvedParameters parameters;
 };
 
-// Throws a CommandError (kUsage) if a required parameter has no value.
-void requireParameters(const DescribedDiagnostic& diagnostic, const ResolvedParameters& parameters);
+// A sentence about the first required parameter that has no value; empty if there is none.
+std::string missingParameterOf(const DescribedDiagnostic& diagnostic, const ResolvedParameters& parameters);
 
 }  // namespace quazor

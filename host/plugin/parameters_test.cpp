@@ -361,19 +361,18 @@ TEST(BindParameters, GivesAnExperimentItsOwnValuesAndElseThoseOfItsDiagnostics) 
   EXPECT_EQ(bound.experiment[0].value, Value(9));
 }
 
-TEST(RequireParameters, RefusesARequiredParameterWithoutAValue) {
-  const auto require = [](const DescribedDiagnostic& diagnostic, const std::vector<std::string>& texts) {
-    return refusalOf(ExitCode::kUsage,
-                     [&] { requireParameters(diagnostic, resolveParameters(diagnostic, {}, settings(texts))); });
+TEST(MissingParameter, IsARequiredOneWithoutAValue) {
+  const auto missing = [](const DescribedDiagnostic& diagnostic, const std::vector<std::string>& texts) {
+    return missingParameterOf(diagnostic, resolveParameters(diagnostic, {}, settings(texts)));
   };
-  EXPECT_EQ(require(sync(), {}),
+  EXPECT_EQ(missing(sync(), {}),
             "Sync.Back requires the parameter experiment.duration; set it with "
             "--set experiment.duration=VALUE or in a profile");
-  EXPECT_EQ(require(imagesAlone(), {"timeout=1"}),
+  EXPECT_EQ(missing(imagesAlone(), {"timeout=1"}),
             "Images requires the parameter images; set it with --set images=VALUE or in a profile");
-  EXPECT_THAT(require(fault(), {"experiment.frameCount=1", "timeout=1"}), HasSubstr("analysis.frameCount"));
-  EXPECT_EQ(require(fault(), {"frameCount=1", "timeout=1"}), "accepted");
-  EXPECT_EQ(require(relaxed(), {}), "accepted");
+  EXPECT_THAT(missing(fault(), {"experiment.frameCount=1", "timeout=1"}), HasSubstr("analysis.frameCount"));
+  EXPECT_EQ(missing(fault(), {"frameCount=1", "timeout=1"}), "");
+  EXPECT_EQ(missing(relaxed(), {}), "");
 }
 
 TEST(DictionaryOf, HoldsOnlyWhatIsSet) {

@@ -173,7 +173,7 @@ LogLevel levelAt(const Json& json, const char* key) {
 
 Verdict verdictAt(const Json& json, const char* key) {
   const std::string name = get<std::string>(json, key);
-  for (const Verdict verdict : {Verdict::kPass, Verdict::kFail, Verdict::kError}) {
+  for (const Verdict verdict : {Verdict::kPass, Verdict::kFail, Verdict::kError, Verdict::kSkip}) {
     if (nameOf(verdict) == name) return verdict;
   }
   throw InputError("unknown verdict '" + name + "'");
@@ -341,6 +341,17 @@ RunEvent readFaultsCounted(const Json& json) {
   return event;
 }
 
+Json jsonOf(const DiagnosticSkipped& event) {
+  return {{"event", "skipped"}, {"kind", nameOf(event.skip.kind)}, {"reason", losslessText(event.skip.reason)}};
+}
+
+RunEvent readSkipped(const Json& json) {
+  const std::string name = get<std::string>(json, "kind");
+  const std::optional<SkipKind> kind = skipKindNamed(name);
+  if (!kind) throw InputError("unknown kind of skip '" + name + "'");
+  return DiagnosticSkipped{{*kind, textAt(json, "reason")}};
+}
+
 Json jsonOf(const DiagnosticCompleted& /*event*/) { return {{"event", "diagnosticCompleted"}}; }
 
 RunEvent readDiagnosticCompleted(const Json& /*json*/) { return DiagnosticCompleted{}; }
@@ -381,6 +392,7 @@ constexpr Reader kReaders[] = {{"runBegan", readRunBegan},
                                {"found", readFound},
                                {"failed", readFailed},
                                {"faultsCounted", readFaultsCounted},
+                               {"skipped", readSkipped},
                                {"diagnosticCompleted", readDiagnosticCompleted},
                                {"diagnosticEnded", readDiagnosticEnded},
                                {"runEnded", readRunEnded}};

@@ -34,7 +34,11 @@ class Verifier {
     }
     checkPlace(event);
     builder_.onEvent(event);
-    if (std::holds_alternative<DiagnosticStarted>(event)) hostError_ = nullptr;
+    if (std::holds_alternative<DiagnosticStarted>(event)) {
+      hostError_ = nullptr;
+      wasSkipped_ = false;
+    }
+    if (std::holds_alternative<DiagnosticSkipped>(event)) wasSkipped_ = true;
     if (std::holds_alternative<DiagnosticEnded>(event)) checkVerdict();
   }
 
@@ -84,6 +88,9 @@ class Verifier {
     run_.push_back(record.name);
     records_.push_back(resultsOf(record));
     RecordJudgement judged = judgeRecord(record, builder_.isCompleted());
+    if (wasSkipped_ && !isUntouched(record)) {
+      add(record.name + " was skipped, but something of it is recorded");
+    }
     const DiagnosticErrorPtr due = record.error == nullptr ? judged.error : nullptr;
     if (hostError_ != nullptr && isNotRecorded(*hostError_)) {
       judged.verdict = Verdict::kError;
@@ -104,6 +111,7 @@ class Verifier {
     results.experimentName = record.experimentName;
     results.measuredResults = record.measuredResults;
     results.error = record.error;
+    results.skip = record.skip;
     return results;
   }
 
@@ -111,6 +119,7 @@ class Verifier {
 
   RecordBuilder builder_;
   DiagnosticErrorPtr hostError_;
+  bool wasSkipped_ = false;  // the diagnostic that began last
   std::vector<std::string> toRun_;
   std::vector<UserLimit> limits_;
   std::vector<DiagnosticRecord> records_;

@@ -94,8 +94,13 @@ void addLimit(std::vector<std::string>& cells, const std::optional<QZLimit>& lim
   }
 }
 
+bool hasSkips(const std::vector<DiagnosticRecord>& records) {
+  return std::any_of(records.begin(), records.end(), [](const DiagnosticRecord& one) { return one.skip.has_value(); });
+}
+
 // Appends one line. `cells` are those of a result; empty if the diagnostic has none.
-void appendDiagnosticLine(std::string& csv, const DiagnosticRecord& record, const std::vector<std::string>& ofResult) {
+void appendDiagnosticLine(std::string& csv, const DiagnosticRecord& record, const std::vector<std::string>& ofResult,
+                          const std::vector<std::string>& more) {
   std::vector<std::string> cells{textCell(record.name), std::string(nameOf(record.verdict))};
   cells.insert(cells.end(), ofResult.begin(), ofResult.end());
   cells.resize(kDiagnosticColumns.size() - 4);
@@ -105,6 +110,7 @@ void appendDiagnosticLine(std::string& csv, const DiagnosticRecord& record, cons
                  {textCell(error->domain()), std::to_string(error->code()), textCell(error->localizedDescription())});
   }
   cells.resize(kDiagnosticColumns.size());
+  cells.insert(cells.end(), more.begin(), more.end());
   appendLine(csv, {cells.begin(), cells.end()});
 }
 
@@ -168,15 +174,20 @@ std::string experimentCsv(const std::vector<DiagnosticRecord>& records) {
 
 std::string diagnosticCsv(const std::vector<DiagnosticRecord>& records) {
   std::string csv;
-  appendLine(csv, kDiagnosticColumns);
+  std::vector<std::string_view> columns = kDiagnosticColumns;
+  const bool withSkips = hasSkips(records);
+  if (withSkips) columns.insert(columns.end(), {"skipKind", "skipReason"});
+  appendLine(csv, columns);
   for (const DiagnosticRecord& record : records) {
+    std::vector<std::string> more(withSkips ? 2 : 0);
+    if (record.skip) more = {std::string(nameOf(record.skip->kind)), textCell(record.skip->reason)};
     const std::vector<LimitCheck> checks = limitChecksOf(record);
     for (std::size_t i = 0; i < record.measuredResults.size(); ++i) {
       const auto& [result, verdict, ignored] = record.measuredResults[i];
-      appendDiagnosticLine(csv, record, cellsOf(result, result.limit(), nameOf(verdict)));
-      for (const LimitCheck& check : checksOfResult(checks, i)) appendDiagnosticLine(csv, record, cellsOf(check));
+      appendDiagnosticLine(csv, record, cellsOf(result, result.limit(), nameOf(verdict)), more);
+      for (const LimitCheck& check : checksOfResult(checks, i)) appendDiagnosticLine(csv, record, cellsOf(check), more);
     }
-    if (record.measuredResults.empty()) appendDiagnosticLine(csv, record, {});
+    if (record.measuredResults.empty()) appendDiagnosticLine(csv, record, {}, more);
   }
   return csv;
 }

@@ -141,14 +141,19 @@ void printExperiment(std::ostream& out, const DiagnosticRecord& record, TextStyl
   }
   out << "\n  " << verdictText(record, style.colour) << '\n';
   if (record.verdict == Verdict::kError) out << errorText(record.error, "    ");
+  if (record.skip) out << "    " << printable(textOf(*record.skip)) << '\n';
   out << '\n';
 }
 
 void printExperimentSummary(std::ostream& out, const std::vector<DiagnosticRecord>& records) {
-  const auto errors = static_cast<std::size_t>(std::count_if(
-      records.begin(), records.end(), [](const DiagnosticRecord& one) { return one.verdict == Verdict::kError; }));
-  out << records.size() << (records.size() == 1 ? " experiment: " : " experiments: ") << records.size() - errors
-      << " returned a result, " << errors << " ended in an error\n";
+  const auto countOf = [&records](Verdict verdict) {
+    return std::count_if(records.begin(), records.end(),
+                         [verdict](const DiagnosticRecord& one) { return one.verdict == verdict; });
+  };
+  out << records.size() << (records.size() == 1 ? " experiment: " : " experiments: ") << countOf(Verdict::kPass)
+      << " returned a result, " << countOf(Verdict::kError) << " ended in an error";
+  if (const auto skipped = countOf(Verdict::kSkip); skipped > 0) out << ", " << skipped << " skipped";
+  out << '\n';
 }
 
 }  // namespace quazor

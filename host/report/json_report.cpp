@@ -108,10 +108,9 @@ Json declarationJson(const std::string& name, const QZDescription& description,
 
 // A record with its results and its analysis, or what an experiment alone has of it.
 Json recordJson(const DiagnosticRecord& record, Json parameters, bool hasAnalysis) {
-  Json json = {{"name", record.name},
-               {"summary", record.summary},
-               {"verdict", nameOf(record.verdict)},
-               {"parameters", std::move(parameters)}};
+  Json json = {{"name", record.name}, {"summary", record.summary}, {"verdict", nameOf(record.verdict)}};
+  if (record.skip) json["skip"] = {{"kind", nameOf(record.skip->kind)}, {"reason", record.skip->reason}};
+  json["parameters"] = std::move(parameters);
   if (hasAnalysis) json["measuredResults"] = resultsJson(record);
   json["measurements"] = measurementsJson(record.measurements);
   json["auxiliaryData"] = dictionaryJson(record.auxiliaryData);

@@ -122,11 +122,12 @@ JUnitSuite suiteOf(const RunStarted& run, const DiagnosticRecord& record) {
     addResult(suite, record.measuredResults[i]);
     for (const LimitCheck& check : checksOfResult(checks, i)) addCheck(suite, check);
   }
-  if (record.experimentOnly && record.verdict != Verdict::kError) addExperiment(suite, record);
+  if (record.experimentOnly && record.verdict == Verdict::kPass) addExperiment(suite, record);
   // If results cannot be judged, their own cases have the errors.
   if (record.error != nullptr && !isOfResult(*record.error)) {
     suite.addError(std::string(errorStageText(record)), {}, record.error);
   }
+  if (record.skip) suite.addSkipped(std::string(nameOf(record.skip->kind)), record.skip->reason);
   suite.addLog(record.log);
   return suite;
 }

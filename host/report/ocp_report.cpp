@@ -199,6 +199,7 @@ class OcpRecordWriter {
     addText(metadata, "summary", record_.summary);
     addText(metadata, "experiment", record_.experimentName);
     addText(metadata, "analysis", record_.analysisName);
+    if (record_.skip) metadata["skip"] = {{"kind", nameOf(record_.skip->kind)}, {"reason", record_.skip->reason}};
     RunStarted ofRecord = run_;
     ofRecord.seed = record_.seed;
     ofRecord.ofExperiments = record_.experimentOnly;
@@ -206,6 +207,9 @@ class OcpRecordWriter {
     stream_.addToRun("testRunStart",
                      startJson(ofRecord, record_.name, std::move(command), record_.parameters, std::move(metadata)),
                      record_.begin);
+    if (record_.skip) {
+      stream_.addToRun("log", {{"severity", "INFO"}, {"message", textOf(*record_.skip)}}, record_.end);
+    }
     writeExperiment();
     writeAnalysis();
     if (!errorIsWritten_) {
@@ -313,6 +317,7 @@ class OcpRecordWriter {
   void writeEnd() {
     switch (record_.verdict) {
       case Verdict::kPass: return stream_.end("COMPLETE", "PASS", record_.end);
+      case Verdict::kSkip: return stream_.end("SKIP", "NOT_APPLICABLE", record_.end);
       case Verdict::kFail: return stream_.end("COMPLETE", "FAIL", record_.end);
       case Verdict::kError: break;
     }

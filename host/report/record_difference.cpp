@@ -37,6 +37,7 @@ Facts factsOf(const DiagnosticRecord& record) {
   Facts facts;
   facts.set("verdict", std::string(nameOf(record.verdict)));
   facts.set("error", oneLine(record.error));
+  if (record.skip) facts.set("skip", textOf(*record.skip));
   for (const Part part : {Part::kExperiment, Part::kAnalysis}) {
     for (const ResolvedParameter& one : record.parameters.of(part)) {
       setFact(facts, formatMessage("parameter %@.%@", nameOf(part), one.name),

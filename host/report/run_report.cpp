@@ -5,6 +5,7 @@
 #include "host/system/output_file.h"
 #include "host/text/table.h"
 
+#include <algorithm>
 #include <utility>
 
 namespace quazor {
@@ -40,6 +41,9 @@ void RunReport::addRecord(DiagnosticRecord record) {
   // The CSV table of measurements has no column for errors.
   if (options_.format == Format::kCsv && run_.ofExperiments && record.error != nullptr) {
     console_.err << "quazor: " << printable(record.name) << " ended in an error\n" << errorText(record.error, "  ");
+  }
+  if (options_.format == Format::kCsv && run_.ofExperiments && record.skip) {
+    console_.err << "quazor: " << printable(record.name) << " was skipped, " << printable(textOf(*record.skip)) << '\n';
   }
   printUnfiredFaults(console_.err, record);
   records_.push_back(std::move(record));
@@ -81,15 +85,19 @@ void RunReport::writeFile(const OutputRequest& output, const std::optional<std::
   }
 }
 
-ExitCode RunReport::exitCode() const { return allWritten_ ? exitCodeOf(records_) : ExitCode::kCannotWrite; }
+ExitCode RunReport::exitCode() const {
+  return allWritten_ ? exitCodeOf(records_, options_.exitRules) : ExitCode::kCannotWrite;
+}
 
-ExitCode exitCodeOf(const std::vector<DiagnosticRecord>& records) {
-  ExitCode code = ExitCode::kAllPassed;
-  for (const DiagnosticRecord& record : records) {
-    if (record.verdict == Verdict::kError) return ExitCode::kError;
-    if (record.verdict == Verdict::kFail) code = ExitCode::kFailed;
-  }
-  return code;
+ExitCode exitCodeOf(const std::vector<DiagnosticRecord>& records, const ExitRules& rules) {
+  const auto countOf = [&records](Verdict verdict) {
+    return std::count_if(records.begin(), records.end(),
+                         [verdict](const DiagnosticRecord& one) { return one.verdict == verdict; });
+  };
+  if (countOf(Verdict::kError) > 0) return ExitCode::kError;
+  if (countOf(Verdict::kFail) > 0) return ExitCode::kFailed;
+  const bool isSkipped = countOf(Verdict::kSkip) > 0;
+  return isSkipped && (!rules.allowSkips || countOf(Verdict::kPass) == 0) ? ExitCode::kError : ExitCode::kAllPassed;
 }
 
 }  // namespace quazor

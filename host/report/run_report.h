@@ -24,12 +24,18 @@ struct Console {
   bool blocks = false;         // `out` supports UTF-8 and block elements
 };
 
+// What the user allows in a run with exit code 0.
+struct ExitRules {
+  bool allowSkips = false;
+};
+
 struct ReportOptions {
   Format format = Format::kText;
   // The destination of the report in that format; empty for the console.
   std::filesystem::path output;
   std::vector<OutputRequest> outputs{};  // additional reports
   LogLevel shownLog = LogLevel::kError;  // lines up to this level go to the console's error stream
+  ExitRules exitRules{};
   TextContent text{};
 };
 
@@ -65,7 +71,8 @@ class RunReport final : public RunEventSink {
   bool allWritten_ = true;
 };
 
-// The exit code for the verdicts. An error takes precedence over a failure.
-ExitCode exitCodeOf(const std::vector<DiagnosticRecord>& records);
+// The exit code for the verdicts. An error takes precedence over a failure, and a failure over a skip that is not
+// allowed. That all were skipped is never allowed.
+ExitCode exitCodeOf(const std::vector<DiagnosticRecord>& records, const ExitRules& rules = {});
 
 }  // namespace quazor

@@ -58,6 +58,7 @@ std::string listText(const std::vector<std::string>& names) {
 }
 
 std::string failureText(const DiagnosticRecord& record) {
+  if (record.skip) return textOf(*record.skip);
   if (record.error != nullptr) return formatMessage("%@ code %@", record.error->domain(), record.error->code());
   return listText(failedResults(record));
 }
@@ -100,6 +101,7 @@ std::string resultCountsText(const DiagnosticRecord& record) {
 }
 
 void printShortRecord(std::ostream& out, const DiagnosticRecord& record, bool colour, std::size_t nameWidth) {
+  if (record.skip) return printVerdict(out, record, colour, printable(textOf(*record.skip)), nameWidth);
   printVerdict(out, record, colour, resultCountsText(record), nameWidth);
   const bool passed = record.verdict == Verdict::kPass;
   std::ostringstream table;
@@ -118,7 +120,7 @@ void printFailures(std::ostream& out, const std::vector<DiagnosticRecord>& recor
     out << verdictColumn(record, colour) << printable(record.name);
     if (const std::string text = failureText(record); !text.empty()) out << ": " << printable(text);
     out << '\n';
-    if (!isExplained) continue;
+    if (!isExplained || record.skip) continue;
     const std::vector<std::string> topics = topicsOf(record);
     const auto found = std::find_if(topics.begin(), topics.end(), isExplained);
     if (found != topics.end() && std::find(asked.begin(), asked.end(), *found) == asked.end()) asked.push_back(*found);

@@ -23,6 +23,7 @@ std::string_view wordOf(const DiagnosticRecord& record) {
   switch (record.verdict) {
     case Verdict::kPass: return record.experimentOnly ? "DONE" : "PASS";
     case Verdict::kFail: return "FAIL";
+    case Verdict::kSkip: return "SKIP";
     case Verdict::kError: break;
   }
   return "ERROR";
@@ -32,6 +33,7 @@ std::string_view colourOf(Verdict verdict) {
   switch (verdict) {
     case Verdict::kPass: return kGreen;
     case Verdict::kFail: return kRed;
+    case Verdict::kSkip:
     case Verdict::kError: break;
   }
   return kYellow;
@@ -184,6 +186,7 @@ void printRecord(std::ostream& out, const DiagnosticRecord& record, bool colour)
   }
   out << "\n  " << verdictText(record, colour) << '\n';
   if (record.verdict == Verdict::kError) out << errorText(record.error, "    ");
+  if (record.skip) out << "    " << printable(textOf(*record.skip)) << '\n';
   out << '\n';
 }
 
@@ -203,6 +206,7 @@ void printSummary(std::ostream& out, const std::vector<DiagnosticRecord>& record
   out << count(records.size(), records.size() == 1 ? "diagnostic" : "diagnostics") << ": "
       << count(countOf(Verdict::kPass), "passed") << ", " << count(countOf(Verdict::kFail), "failed") << ", "
       << count(countOf(Verdict::kError), "ended in an error");
+  if (const std::size_t skipped = countOf(Verdict::kSkip); skipped > 0) out << ", " << count(skipped, "skipped");
   if (const std::size_t warnings = warningsIn(records); warnings > 0) {
     out << ", " << count(warnings, warnings == 1 ? "warning" : "warnings");
   }

@@ -222,8 +222,8 @@ FaultTargets targetsOf(const Binding& binding) {
 }
 
 Binding bindingOf(const JsonCursor& document) {
-  document.allowKeys(
-      {"$schema", "title", "description", "cameras", "groups", "counterFiles", "tracepoints", "display", "faults"});
+  document.allowKeys({"$schema", "title", "description", "cameras", "groups", "counterFiles", "tracepoints", "display",
+                      "faults", "absent"});
   checkRemark(document, "$schema");
   checkRemark(document, "description");
   Binding binding;

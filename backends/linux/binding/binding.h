@@ -128,8 +128,8 @@ struct Binding {
   std::vector<Fault> faults;
 };
 
-// Reads a binding file (the format is described in data/bindings/binding.schema.json). Throws InputError with one
-// sentence that contains the file, the place and the expectation.
+// Reads a binding file (the format is described in data/bindings/binding.schema.json), without its key `absent`, which
+// the host reads. Throws InputError with one sentence that contains the file, the place and the expectation.
 Binding readBinding(const std::filesystem::path& file);
 
 }  // namespace quazor

@@ -144,7 +144,7 @@ FaultTargets targetsOf(const Scenario& scenario) {
 
 Scenario scenarioOf(const JsonCursor& document) {
   document.allowKeys({"$schema", "title", "base", "device", "cameras", "groups", "reports", "hidDevices", "display",
-                      "faults", "expect"});
+                      "faults", "expect", "absent"});
   Scenario scenario;
   scenario.title = document.at("title").text();
   if (const auto schema = document.find("$schema")) schema->text();

@@ -214,7 +214,7 @@ TEST_F(ScenarioReaderTest, DocumentsThatMeanNothingAreRefusedWithTheirPath) {
        "p.json:2: the document: unknown key \"fault\"; did you mean \"faults\"?"},
       {"a key that is far from any", with(R"("zzz": 1)"),
        "p.json:2: the document: unknown key \"zzz\"; expected one of \"$schema\", \"title\", \"base\", \"device\", "
-       "\"cameras\", \"groups\", \"reports\", \"hidDevices\", \"display\", \"faults\", \"expect\"."},
+       "\"cameras\", \"groups\", \"reports\", \"hidDevices\", \"display\", \"faults\", \"expect\", \"absent\"."},
       {"a key twice", with(R"("device": {"present": true, "present": false})"),
        "p.json:2: device: the key \"present\" is duplicated; remove one."},
       {"a key twice at the top", with(R"("title": "again")"), "p.json:2: the key \"title\" is duplicated; remove one."},
