@@ -25,8 +25,8 @@ ExitCode analyzeCommand(const Options& options, const Installation& installation
                         WatchedSignals* signals);
 
 // verify: kAllPassed if every verdict in each record follows from the rest of it and its run ended. Otherwise the worst
-// of kCannotRead (no complete line), kFailed (something is wrong) and kIncomplete (the run did not end). A folder stands
-// for the records in it. Throws a CommandError (kCannotRead) if the only record, or a folder, cannot be read.
+// of kCannotRead (no complete line), kFailed (something is wrong) and kIncomplete (the run did not end). A folder
+// stands for the records in it. Throws a CommandError (kCannotRead) if the only record, or a folder, cannot be read.
 ExitCode verifyCommand(const Options& options, Console& console);
 
 // diff: kAllPassed if two records agree, else kFailed. They agree if the same diagnostics have the same verdicts,

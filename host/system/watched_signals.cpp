@@ -140,10 +140,9 @@ void WatchedSignals::drain() const {
 int WatchedSignals::requestsToEnd() const { return requests; }
 
 void WatchedSignals::wait(std::chrono::nanoseconds time) const {
-  using SteadyClock = std::chrono::steady_clock;
-  const SteadyClock::time_point end = SteadyClock::now() + time;
+  const auto end = std::chrono::steady_clock::now() + time;
   while (requestsToEnd() == 0) {
-    const auto left = std::chrono::ceil<std::chrono::milliseconds>(end - SteadyClock::now());
+    const auto left = std::chrono::ceil<std::chrono::milliseconds>(end - std::chrono::steady_clock::now());
     if (left.count() <= 0) return;
     pollfd watched{descriptor_, POLLIN, 0};
     ::poll(&watched, 1, static_cast<int>(std::min<std::int64_t>(left.count(), kLongestPoll)));
