@@ -129,6 +129,7 @@ std::vector<std::filesystem::path> filesIn(const std::vector<std::filesystem::pa
     if (problem) refuse(directory.string(), problem.message() + ".");
   }
   std::vector<std::filesystem::path> sorted;
+  sorted.reserve(files.size());
   for (const auto& [name, file] : files) sorted.push_back(file);
   return sorted;
 }

@@ -53,6 +53,7 @@ void requireValues(const std::vector<ParameterOverride>& settings) {
   const DescribedDiagnostic diagnostic = diagnosticWithParameters();
   if (!accepted([&] { return checkOverrides(settings, {diagnostic}), true; })) return;
   const ResolvedParameters parameters = resolveParameters(diagnostic, {}, settings);
+  bool isComplete = true;
   for (const Part part : {Part::kExperiment, Part::kAnalysis}) {
     for (const ResolvedParameter& one : parameters.of(part)) {
       std::optional<Value> expected;
@@ -62,9 +63,11 @@ void requireValues(const std::vector<ParameterOverride>& settings) {
         expected = setting.value;
       }
       require(one.value == expected && one.source == (expected ? "environment" : ""), "a setting sets its parameter");
+      isComplete = isComplete && one.value;
     }
   }
-  accepted([&] { return requireParameters(diagnostic, parameters), true; });
+  require(missingParameterOf(diagnostic, parameters).empty() == isComplete,
+          "a required parameter without a value is told");
 }
 
 }  // namespace
