@@ -1,4 +1,4 @@
-// The options that choose which diagnostics run, when a run stops, and how often it is repeated.
+// The options that choose which diagnostics run, what is skipped, and when a run stops.
 #pragma once
 
 #include "host/device/skip.h"

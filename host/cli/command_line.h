@@ -45,8 +45,8 @@ inline constexpr std::string_view kCommandNames[] = {"list",    "describe",   "r
 
 // A parsed command line. Options that the command does not have keep their defaults.
 struct Options {
-  std::vector<std::string>
-      names;  // positional arguments: diagnostics or experiments, topics, a shell, "probe", a folder
+  // Positional arguments: diagnostics or experiments, topics, a shell, "probe", a folder.
+  std::vector<std::string> names;
   std::vector<std::filesystem::path> plugins;  // empty: those in the folders of plug-ins
   std::vector<ParameterOverride> settings;
   std::vector<UserLimit> limits;
@@ -58,7 +58,7 @@ struct Options {
   std::filesystem::path profile;               // empty: the installed one
   std::optional<Profile> recorded;             // the parameters of the run that is repeated
   std::filesystem::path phone;                 // a scenario, or linux:BINDING; empty: the installed healthy one
-  Choice choice;                               // of what runs, and how often
+  Choice choice;                               // of what runs
   ReportOptions report;
   std::vector<DeadlineSetting> deadlines;
   std::chrono::nanoseconds grace = kDefaultGrace;

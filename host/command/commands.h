@@ -40,7 +40,8 @@ ExitCode doctorCommand(const Options& options, const Installation& installation,
 
 // selftest: runs the expected outcomes of every installed phone, or of the phones and files named in the options, with
 // the requested number of seeds. kAllPassed if every outcome is as expected, else kFailed. Throws a CommandError if a
-// file cannot be read, and kInterrupted on an interrupt. `signals` is null with --in-process.
+// file cannot be read. An interrupt ends it with kInterrupted, after the matrix of the phones that are done. `signals`
+// is null with --in-process.
 ExitCode selftestCommand(const Options& options, const Installation& installation, Console& console,
                          WatchedSignals* signals);
 
