@@ -170,6 +170,14 @@ void addLimits(CLI::App& command, RawOptions& raw) {
                 "[DIAGNOSTIC:]RESULT OP NUMBER [UNIT] [+- TOLERANCE]");
 }
 
+void addLogLimit(CLI::App& command, RawOptions& raw) {
+  command
+      .add_option("--log-limit", raw.logLimit,
+                  "Keep at most this many log lines of each diagnostic, and this much of their text; the number of "
+                  "lines left out is logged at its end. Default 1000000,64")
+      ->type_name("LINES[,MEBIBYTES]|none");
+}
+
 void addLogOptions(CLI::App& command, RawOptions& raw) {
   command
       .add_option("--log-level", raw.logLevel,
@@ -177,11 +185,7 @@ void addLogOptions(CLI::App& command, RawOptions& raw) {
                   "reports. Without this option, errors are printed and reports include default")
       ->type_name("LEVEL")
       ->check(CLI::IsMember({"error", "default", "debug"}));
-  command
-      .add_option("--log-limit", raw.logLimit,
-                  "Keep at most this many log lines of each diagnostic, and this much of their text; the number of "
-                  "lines left out is logged at its end. Default 1000000,64")
-      ->type_name("LINES[,MEBIBYTES]|none");
+  addLogLimit(command, raw);
   command.add_flag("--system-log", raw.systemLog,
                    "Also send log lines to the systemd journal, or to syslog if there is no journal");
 }
@@ -408,6 +412,7 @@ void declareOtherCommands(CLI::App& app, RawOptions& raw) {
   addReportOptions(selftest, raw, {"text", "json"});
   addProcessOptions(selftest, raw);
   addGrace(selftest, raw);
+  addLogLimit(selftest, raw);
   CLI::App& phone =
       *app.add_subcommand("phone", "Find the devices of this machine and print a starter binding for them");
   phone.add_option("WHAT", raw.names, "probe")->type_name("")->required()->expected(1)->check(CLI::IsMember({"probe"}));

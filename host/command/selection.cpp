@@ -1,5 +1,6 @@
 #include "host/command/selection.h"
 
+#include "host/command/explanations.h"
 #include "host/plugin/plugin_loader.h"
 #include "host/plugin/plugin_trust.h"
 #include "host/plugin/profile.h"
@@ -163,6 +164,7 @@ Selection select(const Options& options, const Installation& installation, Watch
   const std::vector<Diagnostic> wanted = wantedOf(catalogue, options, !scan.failed.empty());
   const std::vector<Profile> profiles = profilesOf(options, installation);
   describeForProfiles(options, installation, profiles, described, signals);
+  addExplainedRanges(installation.explanations(), described);
   for (const Profile& profile : profiles) checkProfile(profile, described);
   std::vector<ParameterOverride> settings = overridesOfEnvironment();
   settings.insert(settings.end(), options.settings.begin(), options.settings.end());

@@ -259,11 +259,15 @@ class Selftest {
     RunOptions runOptions;
     runOptions.makePhone = phonesOfScenario(file, false, seed, installation_.scenarioSource());
     runOptions.logLevel = LogLevel::kError;
+    runOptions.logLimit = options_.logLimit;
     RecordBuilder builder;
     builder.onEvent(DiagnosticStarted{diagnostic.name, described.summary(), diagnostic.experimentName,
                                       diagnostic.analysisName, diagnostic.experimentOnly, parameters, seed, dateNow()});
     if (signals_ == nullptr) {
-      runDiagnostic(diagnostic, parameters, runOptions, builder);
+      SharedCounter leftOut;
+      LimitedLog limited(builder, runOptions.logLimit, leftOut);
+      runDiagnostic(diagnostic, parameters, runOptions, limited);
+      if (leftOut.get() > 0) builder.onEvent(leftOutLine(leftOut.get(), limited.lastLine()));
     } else {
       runIsolated(isolation_, *signals_, diagnostic, parameters, runOptions, nullptr, noProgress_, builder);
     }

@@ -2,6 +2,7 @@
 #pragma once
 
 #include "contract/lab.h"
+#include "contract/parameter_range.h"
 
 #include <filesystem>
 #include <optional>
@@ -31,6 +32,9 @@ struct DiagnosticDescription {
   QZDescription analysis{""};
   DiagnosticErrorPtr error;  // why there is no description; null if there is one
   bool isAsked = true;       // false if no description was requested; all other members are then empty
+  // What the parameters accept, where it is known.
+  OrderedMap<QZParameterRange> experimentRanges{};
+  OrderedMap<QZParameterRange> analysisRanges{};
 };
 
 // What the names of a command refer to. kDescribable includes the experiments of diagnostics only if they are requested

@@ -75,8 +75,8 @@ class RecordDefect : public CommandError {
   using CommandError::CommandError;
 };
 
-// Throws a CommandError (kCannotRead) that names the file if it cannot be read or has no complete line, and a
-// RecordDefect (kCannotRead) that names file and line if a line is wrong.
+// Throws a CommandError (kCannotRead) that names the file if it cannot be read, has no complete line or says a version
+// that this program does not know, and a RecordDefect (kCannotRead) that names file and line if a line is wrong.
 StoredRecord readRecord(const std::filesystem::path& file);
 
 // The run stored in a record. Incomplete diagnostics have the verdict kError.

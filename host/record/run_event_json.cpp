@@ -1,6 +1,7 @@
 #include "host/record/run_event_json.h"
 
 #include "base/text/input_error.h"
+#include "host/plugin/parameter_range.h"
 #include "host/record/lossless_json.h"
 #include "host/text/timestamp.h"
 
@@ -397,12 +398,13 @@ constexpr Reader kReaders[] = {{"runBegan", readRunBegan},
                                {"diagnosticEnded", readDiagnosticEnded},
                                {"runEnded", readRunEnded}};
 
-Json halfJson(const QZDescription& description) {
+Json halfJson(const QZDescription& description, const OrderedMap<QZParameterRange>& ranges) {
   Json parameters = Json::array();
   for (const auto& [name, parameter] : description.parameters()) {
     parameters.push_back({{"name", losslessText(name)},
                           {"summary", losslessText(parameter.summary())},
                           {"required", parameter.required()}});
+    if (const QZParameterRange* const range = ranges.find(name)) parameters.back()["range"] = rangeJson(*range);
   }
   return {{"summary", losslessText(description.summary())}, {"parameters", std::move(parameters)}};
 }
@@ -414,6 +416,14 @@ QZDescription halfFrom(const Json& json) {
                              textAt(one, "name"));
   }
   return description;
+}
+
+OrderedMap<QZParameterRange> rangesFrom(const Json& json) {
+  OrderedMap<QZParameterRange> ranges;
+  for (const Json& one : arrayAt(json, "parameters")) {
+    if (one.contains("range")) ranges.set(textAt(one, "name"), rangeFrom(JsonCursor(one["range"])));
+  }
+  return ranges;
 }
 
 }  // namespace
@@ -449,15 +459,17 @@ QZLab::Registration registrationFrom(const Json& json) {
 }
 
 Json descriptionJson(const DiagnosticDescription& description) {
-  return {{"experiment", halfJson(description.experiment)},
-          {"analysis", halfJson(description.analysis)},
+  return {{"experiment", halfJson(description.experiment, description.experimentRanges)},
+          {"analysis", halfJson(description.analysis, description.analysisRanges)},
           {"error", losslessError(description.error)},
           {"isAsked", description.isAsked}};
 }
 
 DiagnosticDescription descriptionFrom(const Json& json) {
-  return {halfFrom(memberOf(json, "experiment")), halfFrom(memberOf(json, "analysis")),
-          errorFrom(memberOf(json, "error")), get<bool>(json, "isAsked")};
+  const Json& experiment = memberOf(json, "experiment");
+  const Json& analysis = memberOf(json, "analysis");
+  return {halfFrom(experiment),       halfFrom(analysis),     errorFrom(memberOf(json, "error")),
+          get<bool>(json, "isAsked"), rangesFrom(experiment), rangesFrom(analysis)};
 }
 
 }  // namespace quazor

@@ -42,7 +42,8 @@ struct Conversation {
 // Throws std::system_error if the process cannot be created.
 Supervised converse(const IsolationOptions& options, WatchedSignals& signals, const Conversation& conversation) {
   const std::string token = randomIdentifier();
-  const auto speak = [&](int descriptor) { conversation.speak(ConnectionWriter(descriptor, token)); };
+  SharedCounter lost;
+  const auto speak = [&](int descriptor) { conversation.speak(ConnectionWriter(descriptor, token, lost)); };
   ChildProcess child(signals, speak, options.memory, isCleanupProcess);
   Supervision supervision;
   supervision.takeLine = [&](std::string_view line) {
@@ -58,7 +59,9 @@ Supervised converse(const IsolationOptions& options, WatchedSignals& signals, co
   supervision.takeOutput = [](std::string_view /*line*/) {};  // there is no run log to write to
   supervision.deadline = conversation.deadline;
   supervision.isDone = [] { return false; };  // what it said counts if it ends well
-  return supervise(child, signals, supervision);
+  Supervised end = supervise(child, signals, supervision);
+  end.lostConnection = lost.get() != 0;
+  return end;
 }
 
 std::string loadingOf(const std::filesystem::path& file) { return "loading the plug-in '" + file.string() + "'"; }
