@@ -29,9 +29,8 @@ def width_of(text):
     """The columns of a text, by the tables of this interpreter."""
     width = 0
     for character in CSI.sub("", text):
-        if unicodedata.category(character) in ("Mn", "Me") or character in "\u200b\u200c\u200d":
-            continue
-        width += 2 if unicodedata.east_asian_width(character) in "WF" else 1
+        if unicodedata.category(character) not in ("Mn", "Me"):
+            width += 2 if unicodedata.east_asian_width(character) in "WF" else 1
     return width
 
 

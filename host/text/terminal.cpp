@@ -219,7 +219,10 @@ std::string asciiText(std::string_view text) {
 
 TerminalBuffer::~TerminalBuffer() { passLine(false); }
 
-bool TerminalBuffer::passUnchanged(std::string_view text) { return passLine(false) && pass(text); }
+bool TerminalBuffer::passUnchanged(std::string_view text) {
+  const auto length = static_cast<std::streamsize>(text.size());
+  return passLine(false) && target_->sputn(text.data(), length) == length;
+}
 
 TerminalBuffer::int_type TerminalBuffer::overflow(int_type character) {
   if (traits_type::eq_int_type(character, traits_type::eof())) return traits_type::not_eof(character);
@@ -248,10 +251,6 @@ bool TerminalBuffer::passLine(bool isComplete) {
   std::string text = std::exchange(line_, std::string());
   if (!utf8_) text = asciiText(text);
   if (isComplete) text = foldedLine(text, columnsOf(owner_)) + '\n';
-  return pass(text);
-}
-
-bool TerminalBuffer::pass(std::string_view text) {
   const auto length = static_cast<std::streamsize>(text.size());
   return length == 0 || target_->sputn(text.data(), length) == length;
 }

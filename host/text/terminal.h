@@ -55,7 +55,6 @@ class TerminalBuffer final : public std::streambuf {
  private:
   bool add(char character);
   bool passLine(bool isComplete);
-  bool pass(std::string_view text);
 
   std::streambuf* const target_;
   std::ostream& owner_;
