@@ -4,6 +4,7 @@
 #include "host/error/host_error.h"
 #include "host/model/limit_check.h"
 #include "host/plugin/parameter_range.h"
+#include "host/text/display_width.h"
 #include "host/text/table.h"
 
 #include <algorithm>
@@ -98,16 +99,16 @@ void printHalf(std::ostream& out, std::string_view title, const std::string& nam
   std::vector<Table::Align> columns(isAnyKnown ? 5 : 4, Table::Align::kLeft);
   columns[1] = Table::Align::kRight;
   Table table(columns);
-  const auto addRow = [&](std::vector<std::string> cells, const std::string& accepted) {
+  const auto withAccepted = [isAnyKnown](std::vector<std::string> cells, const std::string& accepted) {
     if (isAnyKnown) cells.insert(cells.end() - 1, accepted);
-    table.addRow(std::move(cells));
+    return cells;
   };
-  addRow({"Parameter", "Value", "From", "Meaning"}, "Accepts");
+  table.addHeader(withAccepted({"Parameter", "Value", "From", "Meaning"}, "Accepts"));
   for (const ResolvedParameter& one : parameters) {
     const std::string unset = one.declaration.required() ? "not set, required" : "not set";
-    addRow({printable(one.name), one.value ? defaultText(*one.value) : "-", one.value ? printable(one.source) : unset,
-            printable(one.declaration.summary())},
-           acceptedText(one));
+    table.addRow(withAccepted({printable(one.name), one.value ? defaultText(*one.value) : "-",
+                               one.value ? printable(one.source) : unset, printable(one.declaration.summary())},
+                              acceptedText(one)));
   }
   table.print(out, "    ");
 }
@@ -167,7 +168,7 @@ std::string_view errorStageText(const DiagnosticRecord& record) {
 void printResults(std::ostream& out, const DiagnosticRecord& record, ResultRows rows, bool colour) {
   using Align = Table::Align;
   Table table({Align::kLeft, Align::kRight, Align::kLeft, Align::kLeft, Align::kLeft});
-  table.addRow({"Result", "Value", "Unit", "Limit", "Verdict"});
+  table.addHeader({"Result", "Value", "Unit", "Limit", "Verdict"});
   const std::vector<LimitCheck> checks = limitChecksOf(record);
   bool empty = true;
   for (std::size_t i = 0; i < record.measuredResults.size(); ++i) {
