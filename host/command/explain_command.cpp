@@ -54,9 +54,10 @@ void printParameters(std::ostream& out, const Explanation& one) {
   out << "\n  Parameters\n";
   for (const ExplainedParameter& parameter : one.parameters) {
     const std::optional<double>& usual = parameter.range.defaultValue();
-    out << wrapped(formatMessage("%@: %@%@", parameter.name, rangeText(parameter.range),
-                                 usual ? formatMessage(", default %@", *usual) : std::string()),
-                   "    ", "      ");
+    printWrapped(out,
+                 formatMessage("%@: %@%@", parameter.name, rangeText(parameter.range),
+                               usual ? formatMessage(", default %@", *usual) : std::string()),
+                 "    ", "      ");
   }
 }
 
@@ -88,15 +89,11 @@ void printExplanation(std::ostream& out, const Explanation& one, const std::vect
     printWrapped(out, joined(one.from), "    ", "    ");
   }
   printMessages(out, one);
-<<<<<<< HEAD
   printParameters(out, one);
-  if (!one.failing.empty()) out << "\n  When it fails\n" << wrapped(one.failing, "    ", "    ");
-=======
   if (!one.failing.empty()) {
     out << "\n  When it fails\n";
     printWrapped(out, one.failing, "    ", "    ");
   }
->>>>>>> main
   out << "\n  Likely causes\n";
   for (const std::string& cause : one.causes) printWrapped(out, cause, "    - ", "      ");
   out << "\n  What to do next\n";
