@@ -48,7 +48,7 @@ Json countsJson(const VerdictCounts& counts) {
 void printVarying(std::ostream& out, const std::vector<VaryingResult>& results) {
   using Align = Table::Align;
   Table table({Align::kLeft, Align::kRight, Align::kRight, Align::kRight, Align::kRight, Align::kLeft, Align::kLeft});
-  table.addRow({"Result", "Values", "Minimum", "Median", "Maximum", "Unit", "Limit"});
+  table.addHeader({"Result", "Values", "Minimum", "Median", "Maximum", "Unit", "Limit"});
   for (const VaryingResult& one : results) {
     table.addRow({printable(one.name), std::to_string(one.values), defaultText(one.minimum), defaultText(one.median),
                   defaultText(one.maximum), printable(one.unit), limitText(one.limit)});
