@@ -149,7 +149,7 @@ ExitCode reviewPlugins(const Options& options, const Installation& installation,
     for (const ReviewFinding& one : findings) {
       std::string rating(nameOf(one.rating));
       rating.resize(9, ' ');
-      console.out << wrapped(one.subject + ": " + one.text, "  " + rating, std::string(11, ' '));
+      printWrapped(console.out, one.subject + ": " + one.text, "  " + rating, std::string(11, ' '));
       if (one.rating == Rating::kProblem) ++problems;
       if (one.rating == Rating::kAdvice) ++advice;
     }

@@ -1,6 +1,7 @@
 #include "host/command/review_rules.h"
 
 #include "contract/message_format.h"
+#include "host/text/display_width.h"
 #include "host/text/table.h"
 
 #include <algorithm>
