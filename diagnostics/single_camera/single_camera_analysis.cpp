@@ -60,7 +60,7 @@ std::unique_ptr<QZAnalysisResult> QZSingleCameraAnalysis::analyzeExperimentResul
   const auto find = [&](std::string_view name) {
     const Measurement* const measurement = result.measurements().find(name);
     if (measurement == nullptr) {
-      fail(error, QZErrorDomain, kMissingMeasurement, nullptr, "Missing measurement for %@", name);
+      fail(error, QZErrorDomain, single_camera::kMissingMeasurement, nullptr, "Missing measurement for %@", name);
     }
     return measurement;
   };

@@ -17,7 +17,6 @@ namespace quazor {
 namespace {
 
 using std::chrono::nanoseconds;
-using namespace single_camera_error;
 
 constexpr double kLongestDuration = 86'400;  // seconds: a day
 
@@ -131,19 +130,20 @@ bool QZSingleCameraExperiment::openStream(DiagnosticErrorPtr* error) {
   const std::shared_ptr<CapturePlugIn> plugIn = platform_.capture->createPlugIn();
   device_ = plugIn == nullptr ? nullptr : plugIn->device(&reason);
   if (device_ == nullptr) {
-    fail(error, SingleCameraErrorDomain, kNoDevice, reason, "There is no capture device.");
+    fail(error, SingleCameraErrorDomain, single_camera_error::kNoDevice, reason, "There is no capture device.");
     return false;
   }
   const std::optional<CaptureStreams> streams = device_->streams(&reason);
   if (!streams || camera_ >= streams->size()) {
-    fail(error, SingleCameraErrorDomain, kNoCamera, streams ? nullptr : reason,
+    fail(error, SingleCameraErrorDomain, single_camera_error::kNoCamera, streams ? nullptr : reason,
          "There is no camera at position %@: the device has %@.", camera_,
          static_cast<std::uint64_t>(streams ? streams->size() : 0));
     return false;
   }
   stream_ = (*streams)[static_cast<std::size_t>(camera_)];
   if (device_->requestControlOfStreams({stream_}, &reason)) return true;
-  fail(error, SingleCameraErrorDomain, kControlRefused, reason, "The camera cannot be controlled.");
+  fail(error, SingleCameraErrorDomain, single_camera_error::kControlRefused, reason,
+       "The camera cannot be controlled.");
   return false;
 }
 
@@ -152,7 +152,8 @@ bool QZSingleCameraExperiment::configureStream(const std::shared_ptr<FrameRecord
   const auto set = [&](std::string_view key, const Value& value) {
     DiagnosticErrorPtr reason;
     if (stream_->setValue(value, key, &reason)) return true;
-    fail(error, SingleCameraErrorDomain, kSettingRefused, reason, "The camera does not accept %@ = %@.", key, value);
+    fail(error, SingleCameraErrorDomain, single_camera_error::kSettingRefused, reason,
+         "The camera does not accept %@ = %@.", key, value);
     return false;
   };
   const Value handlers = Dictionary{
@@ -169,7 +170,8 @@ std::optional<Value> QZSingleCameraExperiment::errorCounters(DiagnosticErrorPtr*
   DiagnosticErrorPtr reason;
   std::optional<Value> counters = stream_->valueForProperty(capture_key::ErrorCounters, &reason);
   if (counters && counters->dictionary() != nullptr) return counters;
-  fail(error, SingleCameraErrorDomain, kNoErrorCounters, reason, "The camera's error counters cannot be read.");
+  fail(error, SingleCameraErrorDomain, single_camera_error::kNoErrorCounters, reason,
+       "The camera's error counters cannot be read.");
   return std::nullopt;
 }
 
@@ -179,7 +181,7 @@ std::unique_ptr<QZExperimentResult> QZSingleCameraExperiment::stream(FrameRecord
   const std::optional<Value> before = errorCounters(error);
   if (!before) return nullptr;
   if (!stream_->start(&reason)) {
-    fail(error, SingleCameraErrorDomain, kStartRefused, reason, "The camera does not start.");
+    fail(error, SingleCameraErrorDomain, single_camera_error::kStartRefused, reason, "The camera does not start.");
     return nullptr;
   }
   const nanoseconds began = platform_.clock->now();
@@ -188,7 +190,7 @@ std::unique_ptr<QZExperimentResult> QZSingleCameraExperiment::stream(FrameRecord
   const std::optional<Value> after = errorCounters(error);
   if (!after) return nullptr;
   if (!stream_->stop(&reason)) {
-    fail(error, SingleCameraErrorDomain, kStopRefused, reason, "The camera does not stop.");
+    fail(error, SingleCameraErrorDomain, single_camera_error::kStopRefused, reason, "The camera does not stop.");
     return nullptr;
   }
   auto result = std::make_unique<QZExperimentResult>();
@@ -207,7 +209,8 @@ bool QZSingleCameraExperiment::teardown(DiagnosticErrorPtr* error) {
   DiagnosticErrorPtr reason;
   // Without a device the run has told why.
   if (device_ == nullptr || device_->invalidate(&reason)) return true;
-  fail(error, SingleCameraErrorDomain, kNoDevice, reason, "The capture device cannot be released.");
+  fail(error, SingleCameraErrorDomain, single_camera_error::kNoDevice, reason,
+       "The capture device cannot be released.");
   return false;
 }
 
