@@ -5,6 +5,7 @@
 #include "host/system/capabilities.h"
 #include "host/system/standard_descriptors.h"
 #include "host/system/write_signals.h"
+#include "host/text/terminal.h"
 
 #include <langinfo.h>
 #include <locale.h>
@@ -13,6 +14,7 @@
 #include <cstdlib>
 #include <exception>
 #include <iostream>
+#include <optional>
 #include <string>
 #include <string_view>
 #include <vector>
@@ -43,7 +45,15 @@ int main(int argc, char** argv) {
     quazor::dropCapabilities();
     quazor::openStandardDescriptors();
     quazor::failWritesWithoutSignals();
-    quazor::Console console{std::cout, std::cerr, wantsColour(), isatty(STDERR_FILENO) == 1, writesUtf8()};
+    const bool utf8 = writesUtf8();
+    std::optional<quazor::TerminalStream> terminalOut;
+    std::optional<quazor::TerminalStream> terminalErr;
+    if (isatty(STDOUT_FILENO) == 1) terminalOut.emplace(std::cout.rdbuf(), STDOUT_FILENO, utf8);
+    if (isatty(STDERR_FILENO) == 1) terminalErr.emplace(std::cerr.rdbuf(), STDERR_FILENO, utf8);
+    std::ostream& out = terminalOut ? *terminalOut : std::cout;
+    std::ostream& err = terminalErr ? *terminalErr : std::cerr;
+    err.tie(&out);
+    quazor::Console console{out, err, wantsColour(), terminalErr.has_value(), utf8};
     const std::vector<std::string> arguments(argv + (argc > 0 ? 1 : 0), argv + argc);
     return static_cast<int>(quazor::runProgram(arguments, quazor::Installation::ofThisProgram(), console));
   } catch (const std::exception& exception) {

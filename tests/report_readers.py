@@ -9,6 +9,7 @@ import io
 import json
 import math
 import re
+import unicodedata
 
 VERDICTS = {("COMPLETE", "PASS"): "pass", ("COMPLETE", "FAIL"): "fail", ("ERROR", "NOT_APPLICABLE"): "error",
             ("SKIP", "NOT_APPLICABLE"): "skip"}
@@ -346,11 +347,24 @@ def read_experiment_csv(rows):
 # --- The text ---
 
 
+def width_of(character):
+    """The columns that a character takes on a terminal."""
+    category = unicodedata.category(character)
+    if category in ("Mn", "Me") or character in "\u200b\u200c\u200d\u2060\ufeff" or "\u1160" <= character <= "\u11ff":
+        return 0
+    return 2 if category != "Cn" and unicodedata.east_asian_width(character) in "WF" else 1
+
+
 def columns_of(line, begins):
-    """The cells of a table line, as bytes. Bytes that continue a code point have no width. A blank precedes every cell,
-    so blanks at the beginning of a cell belong to it."""
-    begins_of_points = [at for at, byte in enumerate(line) if byte & 0xC0 != 0x80]
-    cuts = [begins_of_points[begin - 1] + 1 for begin in begins]
+    """The cells of a table line, as bytes. A blank precedes every cell, so blanks at the beginning of a cell belong to
+    it."""
+    ends = {}  # from the last column of a character to the byte after it
+    column = at = 0
+    for character in line.decode():
+        column += width_of(character)
+        at += len(character.encode())
+        ends.setdefault(column, at)
+    cuts = [ends[begin] for begin in begins]
     return [line[begin:end] for begin, end in zip(cuts, cuts[1:] + [len(line)])]
 
 

@@ -59,7 +59,9 @@ void JsonCursor::allowKeys(std::initializer_list<std::string_view> keys) const {
 
 JsonCursor JsonCursor::at(std::string_view key) const {
   if (std::optional<JsonCursor> entry = find(key)) return *std::move(entry);
-  fail("the key " + inQuotes(key) + " is missing.");
+  const std::string sentence = "the key " + inQuotes(key) + " is missing.";
+  if (document_ != nullptr) document_->failMissing(path_, sentence);
+  fail(sentence);
 }
 
 std::optional<JsonCursor> JsonCursor::find(std::string_view key) const {

@@ -42,6 +42,7 @@ std::string printablePath(std::string_view path) {
 // The progress of the parser: the number of line ends before the character that it read last. That is the last
 // character of the reported value or, for a number, the one after it.
 struct Progress {
+  std::size_t offset = 0;  // of the character after it
   std::size_t line = 1;
   bool tookLineEnd = false;
 };
@@ -59,6 +60,7 @@ class CountingIterator {
 
   reference operator*() const { return *at_; }
   CountingIterator& operator++() {
+    ++progress_->offset;
     if (progress_->tookLineEnd) ++progress_->line;
     progress_->tookLineEnd = *at_++ == '\n';
     return *this;
@@ -87,6 +89,7 @@ class Tracker {
                        CountingIterator(text.data() + text.size(), &progress_), follow);
   }
 
+  const Progress& progress() const { return progress_; }
   std::size_t line() const { return progress_.line; }
   // "NAME:LINE: PATH: " or, for the document as a whole, "NAME:LINE: ".
   std::string place() const {
@@ -146,6 +149,17 @@ class Tracker {
   std::vector<Container> open_;
 };
 
+// Where the value at the path or its key begins; nothing if the path does not exist in the text.
+std::optional<Progress> placeOfPath(std::string_view text, const std::string& path) {
+  if (path.empty()) return Progress();
+  Tracker tracker("");
+  std::optional<Progress> place;
+  tracker.parse(text, [&] {
+    if (!place && tracker.path() == path) place = tracker.progress();
+  });
+  return place;
+}
+
 // The parser's message without its prefix.
 std::string complaintOf(const Json::parse_error& error) {
   const std::string text = error.what();
@@ -201,13 +215,8 @@ std::string sentenceAbout(const std::string& path, const std::string& sentence) 
 }
 
 std::optional<std::size_t> lineOfPath(std::string_view text, const std::string& path) {
-  if (path.empty()) return 1;
-  Tracker tracker("");
-  std::optional<std::size_t> line;
-  tracker.parse(text, [&] {
-    if (!line && tracker.path() == path) line = tracker.line();
-  });
-  return line;
+  const std::optional<Progress> place = placeOfPath(text, path);
+  return place ? std::optional(place->line) : std::nullopt;
 }
 
 JsonDocument::JsonDocument(std::string text, std::string name)
@@ -215,9 +224,19 @@ JsonDocument::JsonDocument(std::string text, std::string name)
 
 JsonDocument JsonDocument::read(const std::filesystem::path& file) { return {textOf(file), file.string()}; }
 
+std::string JsonDocument::textAt(const std::optional<std::size_t>& line, const std::string& path,
+                                 const std::string& sentence) const {
+  return name_ + (line ? ":" + std::to_string(*line) : "") + ": " + sentenceAbout(path, sentence);
+}
+
 void JsonDocument::fail(const std::string& path, const std::string& sentence, const std::string& place) const {
-  const std::optional<std::size_t> line = lineOfPath(text_, place);
-  throw InputError(name_ + (line ? ":" + std::to_string(*line) : "") + ": " + sentenceAbout(path, sentence));
+  const std::optional<Progress> at = placeOfPath(text_, place);
+  if (!at) throw DocumentError(textAt(std::nullopt, path, sentence), 0);
+  throw DocumentError(textAt(at->line, path, sentence), at->offset);
+}
+
+void JsonDocument::failMissing(const std::string& path, const std::string& sentence) const {
+  throw DocumentError(textAt(lineOfPath(text_, path), path, sentence), text_.size());
 }
 
 }  // namespace quazor

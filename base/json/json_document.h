@@ -1,6 +1,8 @@
 // JsonDocument: a JSON file, parsed strictly.
 #pragma once
 
+#include "base/text/input_error.h"
+
 #include <nlohmann/json.hpp>
 
 #include <cstddef>
@@ -8,8 +10,59 @@
 #include <optional>
 #include <string>
 #include <string_view>
+#include <utility>
 
 namespace quazor {
+
+// A mistake at a place of a document. what() begins with the file and the line.
+//
+// Thread: any
+class DocumentError : public InputError {
+ public:
+  DocumentError(const std::string& text, std::size_t offset) : InputError(text), offset_(offset) {}
+
+  // The place in the order of the text.
+  std::size_t offset() const { return offset_; }
+
+ private:
+  std::size_t offset_;
+};
+
+// The first of the mistakes of a document, in the order of its text.
+//
+// Thread: one at a time
+class FirstMistake {
+ public:
+  // Calls `check` and notes the DocumentError that it throws, if any.
+  template <class Check>
+  void of(Check&& check) {
+    try {
+      std::forward<Check>(check)();
+    } catch (const DocumentError& error) {
+      ++noted_;
+      if (!first_ || error.offset() < first_->offset()) first_ = error;
+    }
+  }
+
+  // Calls `check` with each element, in the order of the document, until one has a mistake: those behind it come later.
+  template <class Elements, class Check>
+  void inOrder(const Elements& elements, const Check& check) {
+    const std::size_t before = noted_;
+    for (const auto& one : elements) {
+      of([&] { check(one); });
+      if (noted_ > before) return;
+    }
+  }
+
+  // Throws the DocumentError that comes first, if one was noted.
+  void throwIfAny() const {
+    if (first_) throw DocumentError(*first_);
+  }
+
+ private:
+  std::optional<DocumentError> first_;
+  std::size_t noted_ = 0;
+};
 
 // One JSON value, and the line numbers of the text that it was parsed from. JsonCursor reads the values.
 //
@@ -29,11 +82,17 @@ class JsonDocument {
   // exists in the text.
   void setValue(nlohmann::ordered_json value) { value_ = std::move(value); }
 
-  // Throws InputError, "NAME:LINE: PATH: SENTENCE", with the line of `place`, which is a path too. An empty path means
-  // the whole document.
+  // Throws DocumentError, "NAME:LINE: PATH: SENTENCE", with the line of `place`, which is a path too. An empty path
+  // means the whole document. A place that does not exist in the text has no line and comes first.
   [[noreturn]] void fail(const std::string& path, const std::string& sentence, const std::string& place) const;
+  // Like fail(), for something that is missing at `path`: comes after all that is there, because a key that is missing
+  // often is there with a mistake in its name.
+  [[noreturn]] void failMissing(const std::string& path, const std::string& sentence) const;
 
  private:
+  std::string textAt(const std::optional<std::size_t>& line, const std::string& path,
+                     const std::string& sentence) const;
+
   std::string text_;
   std::string name_;
   nlohmann::ordered_json value_;

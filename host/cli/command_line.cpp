@@ -6,6 +6,7 @@
 #include "host/cli/option_values.h"
 #include "host/device/phone.h"
 #include "host/text/table.h"
+#include "host/text/terminal.h"
 
 #include <CLI/CLI.hpp>
 
@@ -424,6 +425,10 @@ void declareOtherCommands(CLI::App& app, RawOptions& raw) {
       ->expected(1);
 }
 
+// On a narrow terminal the description of an option is below it, with this indentation.
+constexpr std::size_t kNarrow = 70;
+constexpr std::size_t kNarrowColumn = 6;
+
 void declareCommands(CLI::App& app, RawOptions& raw) {
   app.require_subcommand(1);
   app.footer(helpFooter());
@@ -456,6 +461,8 @@ std::optional<Options> parseCommandLine(const std::vector<std::string>& argument
                                         ExitCode* code) {
   CLI::App app("Hardware diagnostics for a phone's cameras and sensors.", "quazor");
   RawOptions raw;
+  const bool isNarrow = columnsOf(out) < kNarrow;
+  if (isNarrow) app.get_formatter()->column_width(kNarrowColumn);
   declareCommands(app, raw);
   *code = ExitCode::kUsage;
   if (arguments.empty()) {

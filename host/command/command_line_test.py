@@ -101,8 +101,8 @@ class RefusalTest(CommandLineTest):
             "missing": (None, ": the file does not exist."),
             "malformed": ("{", ":1: not valid JSON: "),
             "schema": ('{"schema": 9, "diagnostics": {}}', 'schema: must be 1, not 9.'),
-            "diagnostic": (entry('"Fake.Oen": {}'), "'Fake.Oen', which matches no diagnostic; did you mean 'Fake.One'?"),
-            "parameter": (entry('"Fake.*": {"experiment": {"duratoin": 1}}'), "did you mean 'duration'?"),
+            "diagnostic": (entry('"Fake.Oen": {}'), 'no diagnostic has this name; did you mean "Fake.One"?'),
+            "parameter": (entry('"Fake.*": {"experiment": {"duratoin": 1}}'), 'did you mean "duration"?'),
             "text": (entry('"Fake.*": {"experiment": {"duration": "1"}}'), "duration: must be a number, not"),
         }
         for name, (content, problem) in rows.items():

@@ -9,6 +9,7 @@
 #include "host/report/text_report.h"
 #include "host/system/output_file.h"
 #include "host/text/table.h"
+#include "host/text/terminal.h"
 
 #include <algorithm>
 #include <iterator>
@@ -49,7 +50,7 @@ ExitCode list(const Options& options, const Installation& installation, Console&
     std::copy_if(scan.catalogue.begin(), scan.catalogue.end(), std::back_inserter(listed),
                  [&one](const DescribedDiagnostic& candidate) { return contains({one}, candidate.diagnostic); });
   }
-  std::ostringstream text;
+  std::ostringstream text = textFor(options.report, console);
   if (options.report.format == Format::kJson) {
     text << documentText(listDocument(listed));
   } else {
@@ -61,7 +62,7 @@ ExitCode list(const Options& options, const Installation& installation, Console&
 
 ExitCode describe(const Options& options, const Installation& installation, Console& console) {
   const Selection selection = select(options, installation);
-  std::ostringstream text;
+  std::ostringstream text = textFor(options.report, console);
   if (options.report.format == Format::kJson) {
     text << documentText(descriptionDocument(selection.diagnostics));
   } else {
@@ -76,7 +77,7 @@ ExitCode describe(const Options& options, const Installation& installation, Cons
 }
 
 ExitCode explainErrors(const Options& options, const Installation& installation, Console& console) {
-  std::ostringstream text;
+  std::ostringstream text = textFor(options.report, console);
   explain(options.names, installation.explanations(), options.report.format == Format::kJson, text);
   writeOutput(options.report, console, text.str());
   return ExitCode::kAllPassed;
@@ -106,15 +107,23 @@ ExitCode perform(const Options& options, const Installation& installation, Conso
     case Command::kNew: return newCommand(options, installation, console);
     case Command::kCompletion: break;
   }
-  console.out << completionScript(options.names.front()) << std::flush;
+  writeUnfolded(console.out, completionScript(options.names.front()));
+  console.out.flush();
   return ExitCode::kAllPassed;
 }
 
 }  // namespace
 
+std::ostringstream textFor(const ReportOptions& report, const Console& console) {
+  std::ostringstream text;
+  if (report.output.empty()) prepareFor(console.out, text);
+  return text;
+}
+
 void writeOutput(const ReportOptions& report, Console& console, const std::string& output) {
   if (report.output.empty()) {
-    console.out << output << std::flush;
+    report.format == Format::kText ? void(console.out << output) : writeUnfolded(console.out, output);
+    console.out.flush();
     if (!console.out) throw CommandError(ExitCode::kCannotWrite, "standard output cannot be written");
     return;
   }
@@ -126,7 +135,7 @@ namespace {
 ExitCode runArguments(const std::vector<std::string>& arguments, const Installation& installation, Console& console) {
   if (!arguments.empty() && arguments.front() == kCompletionRequest) {
     for (const std::string& one : completionsOf({arguments.begin() + 1, arguments.end()}, installation)) {
-      console.out << one << '\n';
+      writeUnfolded(console.out, one + '\n');
     }
     return ExitCode::kAllPassed;
   }

@@ -7,6 +7,7 @@
 #include "host/report/run_report.h"
 #include "host/system/watched_signals.h"
 
+#include <sstream>
 #include <string>
 #include <vector>
 
@@ -54,6 +55,9 @@ ExitCode phoneCommand(const Options& options, Console& console);
 // Throws a CommandError, and then leaves nothing behind: kUsage for a name that no plug-in can have, kCannotRead
 // without the template, kCannotWrite if the folder exists and is not empty, or cannot be made.
 ExitCode newCommand(const Options& options, const Installation& installation, Console& console);
+
+// A stream for the output of such a command: what is printed there fits where writeOutput() writes it.
+std::ostringstream textFor(const ReportOptions& report, const Console& console);
 
 // Writes the output of a command that does not run a diagnostic to the output file, or else to the console. Throws a
 // CommandError (kCannotWrite) on failure.

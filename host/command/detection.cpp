@@ -108,9 +108,10 @@ std::string strictText(const PhoneDetection& one) {
 }
 
 void printBlindSpot(std::ostream& out, const PhoneDetection& one) {
-  out << '\n' << wrapped(one.phone + " (by strict: " + strictText(one) + ")", "  ", "    ");
-  if (!one.title.empty()) out << wrapped(one.title, "    ", "    ");
-  for (const std::string& reason : one.reasons) out << wrapped(reason, "    - ", "      ");
+  out << '\n';
+  printWrapped(out, one.phone + " (by strict: " + strictText(one) + ")", "  ", "    ");
+  if (!one.title.empty()) printWrapped(out, one.title, "    ", "    ");
+  for (const std::string& reason : one.reasons) printWrapped(out, reason, "    - ", "      ");
 }
 
 std::string countsText(std::string_view by, std::size_t detected, std::size_t faulty, std::size_t falseAlarms) {
@@ -158,7 +159,7 @@ std::vector<std::string> undetectedChanges(const DiagnosticRecord& healthy, cons
 void printDetections(std::ostream& out, const std::vector<PhoneDetection>& phones) {
   using Align = Table::Align;
   Table table({Align::kLeft, Align::kLeft, Align::kLeft, Align::kLeft});
-  table.addRow({"Phone", "Expected", "By default", "By strict"});
+  table.addHeader({"Phone", "Expected", "By default", "By strict"});
   for (const PhoneDetection& one : phones) {
     const std::string_view expected = one.healthy ? "passed" : one.isExpected ? "detected" : "not detected";
     table.addRow(

@@ -141,7 +141,7 @@ class ExperimentTest(CommandLineTest):
         refuse("none of the selected experiments has a parameter 'image'; did you mean 'images'?",
                arguments=["experiment", "Alone.Images", "--set", "image=1"])
         profile = self.write("mine.json", '{"schema": 1, "diagnostics": {}, "experiments": {"Alone": {"images": 5}}}')
-        refuse("has an entry 'Alone', which matches no experiment", code=66,
+        refuse("experiments.Alone: no experiment has this name", code=66,
                arguments=["experiment", "Alone.Images", "--profile", profile])
 
     def test_a_plugin_without_experiments(self):

@@ -27,23 +27,23 @@ std::string joined(const std::vector<std::string>& texts) {
 }
 
 void printNames(std::ostream& out, const Explanation& one) {
-  for (const std::string& name : one.names) out << wrapped(name, "", "");
+  for (const std::string& name : one.names) printWrapped(out, name, "", "");
 }
 
 void printHeading(std::ostream& out, const Explanation& one) {
   printNames(out, one);
   if (!one.isError()) return;
   const std::string symbols = one.symbols.empty() ? "" : " (" + joined(one.symbols) + ")";
-  out << wrapped(formatMessage("%@ code %@%@", one.domain, one.code, symbols), "", "");
+  printWrapped(out, formatMessage("%@ code %@%@", one.domain, one.code, symbols), "", "");
 }
 
 void printMessages(std::ostream& out, const Explanation& one) {
   if (one.messages.empty()) return;
   out << "\n  Messages\n";
   for (const ExplainedMessage& message : one.messages) {
-    out << wrapped("\"" + message.text + "\"", "    ", "    ");
-    out << wrapped("from " + joined(message.from), "      ", "      ");
-    if (!message.meaning.empty()) out << wrapped(message.meaning, "      ", "      ");
+    printWrapped(out, "\"" + message.text + "\"", "    ", "    ");
+    printWrapped(out, "from " + joined(message.from), "      ", "      ");
+    if (!message.meaning.empty()) printWrapped(out, message.meaning, "      ", "      ");
   }
 }
 
@@ -58,23 +58,33 @@ void printErrors(std::ostream& out, const Explanation& one, const std::vector<Ex
   std::string_view heading = "\n  Possible errors\n";
   for (const Explanation& error : all) {
     if (!canEndIn(one.names, error)) continue;
-    out << heading << wrapped(keyOf(error.domain, error.code), "    ", "") << wrapped(error.title, "      ", "      ");
+    out << heading;
+    printWrapped(out, keyOf(error.domain, error.code), "    ", "");
+    printWrapped(out, error.title, "      ", "      ");
     heading = "";
   }
 }
 
 void printExplanation(std::ostream& out, const Explanation& one, const std::vector<Explanation>& all) {
   printHeading(out, one);
-  out << wrapped(one.title, "  ", "  ") << '\n' << wrapped(one.meaning, "  ", "  ");
-  if (!one.from.empty()) out << "\n  Result of\n" << wrapped(joined(one.from), "    ", "    ");
+  printWrapped(out, one.title, "  ", "  ");
+  out << '\n';
+  printWrapped(out, one.meaning, "  ", "  ");
+  if (!one.from.empty()) {
+    out << "\n  Result of\n";
+    printWrapped(out, joined(one.from), "    ", "    ");
+  }
   printMessages(out, one);
-  if (!one.failing.empty()) out << "\n  When it fails\n" << wrapped(one.failing, "    ", "    ");
+  if (!one.failing.empty()) {
+    out << "\n  When it fails\n";
+    printWrapped(out, one.failing, "    ", "    ");
+  }
   out << "\n  Likely causes\n";
-  for (const std::string& cause : one.causes) out << wrapped(cause, "    - ", "      ");
+  for (const std::string& cause : one.causes) printWrapped(out, cause, "    - ", "      ");
   out << "\n  What to do next\n";
   for (std::size_t i = 0; i < one.next.size(); ++i) {
     const std::string number = std::to_string(i + 1) + ". ";
-    out << wrapped(one.next[i], "    " + number, std::string(4 + number.size(), ' '));
+    printWrapped(out, one.next[i], "    " + number, std::string(4 + number.size(), ' '));
   }
   printErrors(out, one, all);
 }
@@ -82,8 +92,8 @@ void printExplanation(std::ostream& out, const Explanation& one, const std::vect
 void printTitles(std::ostream& out, const std::vector<Explanation>& all) {
   for (const Explanation& one : all) {
     printNames(out, one);
-    if (one.isError()) out << wrapped(keyOf(one.domain, one.code), "", "");
-    out << wrapped(one.title, "  ", "  ");
+    if (one.isError()) printWrapped(out, keyOf(one.domain, one.code), "", "");
+    printWrapped(out, one.title, "  ", "  ");
   }
 }
 

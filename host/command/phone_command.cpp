@@ -11,7 +11,9 @@ ExitCode phoneCommand(const Options& options, Console& console) {
   if (options.report.output.empty()) {
     console.out << "\nStarter binding: save it, set which camera is which, and run with --phone linux:FILE.\n\n";
   }
-  writeOutput(options.report, console, probe.binding);
+  ReportOptions binding = options.report;
+  binding.format = Format::kJson;
+  writeOutput(binding, console, probe.binding);
   if (!options.report.output.empty()) {
     console.out << "\nThe starter binding is in " << printable(options.report.output.string())
                 << ": set which camera is which, and run with --phone linux:FILE.\n";

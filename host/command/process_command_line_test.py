@@ -60,8 +60,9 @@ class ParametersTest(CommandLineTest):
             (self.directory / "missing.json", "the file does not exist."),
             (self.write("empty.json", ""), "not valid JSON"),
             (self.directory, "this is a directory, not a file."),
-            (self.profile("typo.json", measurd=1), "did you mean 'measured'?"),
-            (self.write("other.json", '{"schema": 1, "diagnostics": {"Fake.Oen": {}}}'), "matches no diagnostic"),
+            (self.profile("typo.json", measurd=1), 'did you mean "measured"?'),
+            (self.write("other.json", '{"schema": 1, "diagnostics": {"Fake.Oen": {}}}'),
+             "diagnostics.Fake.Oen: no diagnostic has this name"),
         ]
         for path, problem in rows:
             with self.subTest(problem):

@@ -128,7 +128,7 @@ ExitCode diffCommand(const Options& options, Console& console) {
   const RecordedRun before = runIn(options.records[0]);
   const RecordedRun after = runIn(options.records[1]);
   const std::vector<std::string> differences = differencesOf(before, after);
-  std::ostringstream answer;
+  std::ostringstream answer = textFor(options.report, console);
   for (const std::string& one : differences) answer << printable(one) << '\n';
   if (differences.empty()) answer << "The records do not differ.\n";
   writeOutput(options.report, console, answer.str());

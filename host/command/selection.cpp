@@ -3,6 +3,7 @@
 #include "host/plugin/plugin_loader.h"
 #include "host/plugin/plugin_trust.h"
 #include "host/plugin/profile.h"
+#include "host/plugin/profile_check.h"
 
 #include <algorithm>
 #include <cstddef>
@@ -51,16 +52,16 @@ void leaveOut(const std::string& pattern, bool mayBeNone, std::vector<Diagnostic
 std::vector<Profile> profilesOf(const Options& options, const Installation& installation) {
   std::vector<Profile> profiles;
   if (!options.withoutProfile && options.profile.empty()) {
-    profiles.push_back(readProfile(installation.defaultProfile()));
+    profiles.push_back(readProfileToCheck(installation.defaultProfile()));
     profiles.back().mayNameOthers = true;  // the installed profile serves any set of plug-ins
   }
   if (options.recorded) profiles.push_back(*options.recorded);
   if (!options.withoutProfile && !options.profile.empty()) {
     const std::filesystem::path file = installation.profile(options.profile);
-    profiles.push_back(readProfile(file));
+    profiles.push_back(readProfileToCheck(file));
     profiles.back().mayNameOthers = file != options.profile;  // it is an installed one
   }
-  for (const std::filesystem::path& file : options.parameterFiles) profiles.push_back(readProfile(file));
+  for (const std::filesystem::path& file : options.parameterFiles) profiles.push_back(readProfileToCheck(file));
   return profiles;
 }
 

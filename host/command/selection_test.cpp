@@ -132,10 +132,12 @@ TEST_F(SelectionTest, RefusesWhatIsWrongWithParameters) {
   // Only the installed profile may name diagnostics that are not loaded.
   const auto other = directory_.write("other.json", profileText(R"({"Other": {}})"));
   options_.profile = other;
-  EXPECT_THAT(refusal(ExitCode::kCannotRead), HasSubstr("has an entry 'Other', which matches no diagnostic"));
+  EXPECT_THAT(refusal(ExitCode::kCannotRead),
+              HasSubstr("other.json:1: diagnostics.Other: no diagnostic has this name; expected one of \"Fake.One\""));
   options_.profile.clear();
   options_.parameterFiles = {other};
-  EXPECT_THAT(refusal(ExitCode::kCannotRead), HasSubstr("has an entry 'Other', which matches no diagnostic"));
+  EXPECT_THAT(refusal(ExitCode::kCannotRead),
+              HasSubstr("other.json:1: diagnostics.Other: no diagnostic has this name; expected one of \"Fake.One\""));
   options_.parameterFiles = {directory_.path() / "nothing.json"};
   EXPECT_THAT(refusal(ExitCode::kCannotRead), HasSubstr("nothing.json"));
   options_.parameterFiles.clear();
@@ -188,7 +190,7 @@ TEST_F(SelectionTest, AsksWhatElseAnEntryFitsBeforeItRefusesAParameter) {
   const std::string only = profileText(R"({"Fake.*": {"experiment": {"way": 1}}})");
   withEntry(only.c_str());
   EXPECT_THAT(refusal(ExitCode::kCannotRead),
-              HasSubstr("sets 'way', but no experiment of 'Fake.*' has that parameter"));
+              HasSubstr("p.json:1: diagnostics.Fake.*.experiment.way: no experiment of \"Fake.*\" has this parameter"));
   const std::string wide = profileText(R"({"[FU]*[!x]": {"experiment": {"way": 1}}})");
   withEntry(wide.c_str());
   EXPECT_THAT(selected(), ElementsAre("Fake.One"));

@@ -152,7 +152,7 @@ void printSelftest(std::ostream& out, const SelftestOutcome& outcome) {
   printDetections(out, outcome.phones);
   out << '\n';
   Table others({Align::kLeft, Align::kLeft, Align::kLeft, Align::kRight, Align::kLeft});
-  others.addRow({"Phone", "Run", "Expected", "As expected", "Outcome"});
+  others.addHeader({"Phone", "Run", "Expected", "As expected", "Outcome"});
   std::size_t differing = 0;
   for (std::size_t i = 0; i < rows.size(); ++i) {
     if (allPassed({verdicts[i]})) continue;
@@ -172,7 +172,7 @@ void printSelftest(std::ostream& out, const SelftestOutcome& outcome) {
     out << '\n';
   }
   Table matrix({Align::kLeft, Align::kRight, Align::kRight, Align::kRight});
-  matrix.addRow({"Run", "Detected", "False alarms", "Invalid"});
+  matrix.addHeader({"Run", "Detected", "False alarms", "Invalid"});
   for (const auto& [name, counts] : countsOf(rows, verdicts)) {
     matrix.addRow({printable(name), formatMessage("%@ of %@", counts.detected, counts.faulty),
                    formatMessage("%@ of %@", counts.falseAlarms, counts.healthy), std::to_string(counts.invalid)});

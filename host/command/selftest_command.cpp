@@ -59,34 +59,6 @@ bool haveSameValues(const ResolvedParameters& a, const ResolvedParameters& b) {
          std::equal(a.analysis.begin(), a.analysis.end(), b.analysis.begin(), b.analysis.end(), isSame);
 }
 
-// A line on a terminal that is replaced by the next one.
-// Thread: one at a time.
-class StatusLine {
- public:
-  // `terminal` is borrowed; null shows nothing.
-  explicit StatusLine(std::ostream* terminal) : terminal_(terminal) {}
-  StatusLine(const StatusLine&) = delete;
-  StatusLine& operator=(const StatusLine&) = delete;
-  ~StatusLine() { erase(); }
-
-  void show(const std::string& text) {
-    erase();
-    if (terminal_ == nullptr) return;
-    *terminal_ << text << std::flush;
-    lineIsThere_ = true;
-  }
-
-  void erase() {
-    if (!lineIsThere_) return;
-    *terminal_ << "\r\033[K" << std::flush;
-    lineIsThere_ = false;
-  }
-
- private:
-  std::ostream* const terminal_;
-  bool lineIsThere_ = false;
-};
-
 class Selftest {
  public:
   // `signals` is null if the diagnostics run in this process.
@@ -292,7 +264,7 @@ ExitCode selftestCommand(const Options& options, const Installation& installatio
     if (!outcome.isComplete()) throw CommandError(ExitCode::kInterrupted, "interrupted before any phone was tested");
     throw CommandError(ExitCode::kCannotRead, "nothing was tested: no phone has an expected outcome");
   }
-  std::ostringstream text;
+  std::ostringstream text = textFor(options.report, console);
   if (options.report.format == Format::kJson) {
     text << documentText(selftestDocument(outcome));
   } else {

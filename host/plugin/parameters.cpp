@@ -8,7 +8,6 @@
 
 #include <algorithm>
 #include <cstdlib>
-#include <iterator>
 #include <sstream>
 
 namespace quazor {
@@ -25,8 +24,6 @@ std::string_view sourceOf(OverridePlace place) {
   return place == OverridePlace::kEnvironment ? "environment" : "command line";
 }
 
-constexpr Part kParts[] = {Part::kExperiment, Part::kAnalysis};
-
 // The noun for a list of them.
 std::string nounOf(const std::vector<DescribedDiagnostic>& diagnostics) {
   const auto isExperiment = [](const DescribedDiagnostic& one) { return one.diagnostic.experimentOnly; };
@@ -35,25 +32,8 @@ std::string nounOf(const std::vector<DescribedDiagnostic>& diagnostics) {
   return "diagnostics";
 }
 
-const OrderedMap<QZNumberParameter>& declared(const DescribedDiagnostic& diagnostic, Part part) {
-  const DiagnosticDescription& description = diagnostic.description;
-  return (part == Part::kExperiment ? description.experiment : description.analysis).parameters();
-}
-
 bool sets(const ParameterOverride& setting, Part part, std::string_view name) {
   return (!setting.part || *setting.part == part) && setting.name == name;
-}
-
-// The names of the parameters that the diagnostics declare in that part or, without one, in any.
-std::vector<std::string> declaredNames(const std::vector<DescribedDiagnostic>& diagnostics, std::optional<Part> part) {
-  std::vector<std::string> names;
-  for (const DescribedDiagnostic& diagnostic : diagnostics) {
-    for (const Part one : kParts) {
-      if (part && *part != one) continue;
-      for (const auto& [name, ignored] : declared(diagnostic, one)) names.push_back(name);
-    }
-  }
-  return names;
 }
 
 bool contains(const std::vector<std::string>& names, const std::string& name) {
@@ -70,78 +50,6 @@ std::string noteOfUndescribed(const std::vector<DescribedDiagnostic>& diagnostic
   return {};
 }
 
-void checkEntry(const Profile& profile, const ProfileEntry& entry, const std::vector<DescribedDiagnostic>& matched) {
-  const bool allDescribed = std::all_of(matched.begin(), matched.end(), [](const DescribedDiagnostic& one) {
-    return one.description.isAsked && one.description.error == nullptr;
-  });
-  if (!allDescribed) return;
-  for (const Part part : kParts) {
-    const std::vector<std::string> names = declaredNames(matched, part);
-    for (const auto& [name, ignored] : entry.values(part)) {
-      if (contains(names, name)) continue;
-      throw CommandError(ExitCode::kCannotRead, "the " + profile.kind + " '" + profile.file.string() + "' sets '" +
-                                                    name + "', but no " + std::string(nameOf(part)) + " of '" +
-                                                    entry.name + "' has that parameter" + didYouMean(name, names));
-    }
-  }
-}
-
-// The diagnostics or, with `ofExperiments`, the experiments that the entry matches.
-std::vector<DescribedDiagnostic> matchesOf(const ProfileEntry& entry, const std::vector<DescribedDiagnostic>& catalogue,
-                                           bool ofExperiments) {
-  std::vector<DescribedDiagnostic> matched;
-  for (const DescribedDiagnostic& one : catalogue) {
-    const bool fits = matchesName(entry.name, one.diagnostic.name);
-    if (fits && one.diagnostic.experimentOnly == ofExperiments) matched.push_back(one);
-  }
-  return matched;
-}
-
-// True if one of the diagnostics declares each parameter that the entry sets.
-bool declareAll(const std::vector<DescribedDiagnostic>& diagnostics, const ProfileEntry& entry) {
-  for (const Part part : kParts) {
-    const std::vector<std::string> names = declaredNames(diagnostics, part);
-    for (const auto& [name, ignored] : entry.values(part)) {
-      if (!contains(names, name)) return false;
-    }
-  }
-  return true;
-}
-
-// Adds the undescribed matches if the described ones do not declare every parameter of the entry.
-void addDiagnosticsToDescribe(const ProfileEntry& entry, const std::vector<DescribedDiagnostic>& matched,
-                              std::vector<Diagnostic>& undescribed) {
-  std::vector<DescribedDiagnostic> asked;
-  std::copy_if(matched.begin(), matched.end(), std::back_inserter(asked),
-               [](const DescribedDiagnostic& one) { return one.description.isAsked; });
-  const auto couldNot = [](const DescribedDiagnostic& one) { return one.description.error != nullptr; };
-  // An entry that matches nothing selected does not matter. checkProfile skips an entry with a failed description.
-  if (asked.empty() || std::any_of(asked.begin(), asked.end(), couldNot) || declareAll(asked, entry)) return;
-  for (const DescribedDiagnostic& one : matched) {
-    if (!one.description.isAsked && !contains(undescribed, one.diagnostic)) undescribed.push_back(one.diagnostic);
-  }
-}
-
-// Checks the entries for diagnostics or those for experiments.
-void checkEntries(const Profile& profile, const std::vector<ProfileEntry>& entries,
-                  const std::vector<DescribedDiagnostic>& catalogue, bool ofExperiments) {
-  for (const ProfileEntry& entry : entries) {
-    const std::vector<DescribedDiagnostic> matched = matchesOf(entry, catalogue, ofExperiments);
-    if (!matched.empty()) {
-      checkEntry(profile, entry, matched);
-    } else if (!profile.mayNameOthers) {
-      const std::string noun = ofExperiments ? "experiment" : "diagnostic";
-      std::vector<std::string> names;
-      for (const DescribedDiagnostic& one : catalogue) {
-        if (one.diagnostic.experimentOnly == ofExperiments) names.push_back(one.diagnostic.name);
-      }
-      throw CommandError(ExitCode::kCannotRead, "the profile '" + profile.file.string() + "' has an entry '" +
-                                                    entry.name + "', which matches no " + noun +
-                                                    didYouMean(entry.name, names));
-    }
-  }
-}
-
 const Value* findIn(const Profile& profile, const Diagnostic& diagnostic, Part part, std::string_view parameter) {
   return diagnostic.experimentOnly ? profile.findForExperiment(diagnostic.name, diagnostic.usedBy, parameter)
                                    : profile.find(diagnostic.name, part, parameter);
@@ -151,7 +59,7 @@ std::vector<ResolvedParameter> resolvePart(const DescribedDiagnostic& diagnostic
                                            const std::vector<Profile>& profiles,
                                            const std::vector<ParameterOverride>& settings) {
   std::vector<ResolvedParameter> bound;
-  for (const auto& [name, declaration] : declared(diagnostic, part)) {
+  for (const auto& [name, declaration] : diagnostic.parameters(part)) {
     ResolvedParameter parameter{name, declaration, std::nullopt, {}};
     for (const Profile& profile : profiles) {
       const Value* const value = findIn(profile, diagnostic.diagnostic, part, name);
@@ -172,6 +80,17 @@ std::vector<ResolvedParameter> resolvePart(const DescribedDiagnostic& diagnostic
 }
 
 }  // namespace
+
+std::vector<std::string> declaredNames(const std::vector<DescribedDiagnostic>& diagnostics, std::optional<Part> part) {
+  std::vector<std::string> names;
+  for (const DescribedDiagnostic& diagnostic : diagnostics) {
+    for (const Part one : kParts) {
+      if (part && *part != one) continue;
+      for (const auto& [name, ignored] : diagnostic.parameters(one)) names.push_back(name);
+    }
+  }
+  return names;
+}
 
 ParameterOverride parseOverride(const std::string& text, OverridePlace place) {
   const std::string what = quoted(place, text) + ": ";
@@ -209,21 +128,6 @@ Dictionary dictionaryOf(const std::vector<ResolvedParameter>& parameters) {
     if (parameter.value) dictionary.set(parameter.name, *parameter.value);
   }
   return dictionary;
-}
-
-void checkProfile(const Profile& profile, const std::vector<DescribedDiagnostic>& catalogue) {
-  checkEntries(profile, profile.entries, catalogue, false);
-  checkEntries(profile, profile.experiments, catalogue, true);
-}
-
-std::vector<Diagnostic> diagnosticsToDescribe(const Profile& profile,
-                                              const std::vector<DescribedDiagnostic>& catalogue) {
-  std::vector<Diagnostic> undescribed;
-  for (const ProfileEntry& entry : profile.entries)
-    addDiagnosticsToDescribe(entry, matchesOf(entry, catalogue, false), undescribed);
-  for (const ProfileEntry& entry : profile.experiments)
-    addDiagnosticsToDescribe(entry, matchesOf(entry, catalogue, true), undescribed);
-  return undescribed;
 }
 
 void checkOverrides(const std::vector<ParameterOverride>& settings, const std::vector<DescribedDiagnostic>& selected) {

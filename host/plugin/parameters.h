@@ -1,4 +1,5 @@
-// Resolves settings and profiles to the parameter values of a run, and checks them against the declared parameters.
+// Resolves settings and profiles to the parameter values of a run, and checks settings against the declared parameters.
+// profile_check.h checks profiles.
 #pragma once
 
 #include "contract/results.h"
@@ -63,17 +64,14 @@ struct DescribedDiagnostic {
   const std::string& summary() const {
     return diagnostic.experimentOnly ? description.experiment.summary() : diagnostic.summary;
   }
+
+  const OrderedMap<QZNumberParameter>& parameters(Part part) const {
+    return (part == Part::kExperiment ? description.experiment : description.analysis).parameters();
+  }
 };
 
-// Throws a CommandError (kCannotRead) if an entry of the profile sets a parameter that no matching diagnostic or
-// experiment declares or, unless the profile may name others, if an entry matches none. Skips an entry if anything that
-// it matches was not described.
-void checkProfile(const Profile& profile, const std::vector<DescribedDiagnostic>& catalogue);
-
-// The undescribed diagnostics that must be described before checkProfile can check an entry: those that match an entry
-// with a parameter that no described match declares.
-std::vector<Diagnostic> diagnosticsToDescribe(const Profile& profile,
-                                              const std::vector<DescribedDiagnostic>& catalogue);
+// The names of the parameters that the diagnostics declare in that part or, without one, in any.
+std::vector<std::string> declaredNames(const std::vector<DescribedDiagnostic>& diagnostics, std::optional<Part> part);
 
 // Throws a CommandError (kUsage) if no selected diagnostic declares the parameter of a setting, or if one source sets
 // the same parameter twice.

@@ -1,7 +1,7 @@
 #include "host/plugin/parameters.h"
 
 #include "host/error/exit_code.h"
-#include "host/error/host_error.h"
+#include "host/plugin/described_for_tests.h"
 #include "host/testing/test_refusals.h"
 #include "tests/support/thrown_text.h"
 
@@ -14,46 +14,6 @@ namespace quazor {
 namespace {
 
 using testing::HasSubstr;
-
-QZDescription descriptionWith(const std::vector<std::pair<std::string, bool>>& parameters) {
-  QZDescription description("Summary.");
-  for (const auto& [name, required] : parameters) {
-    description.addParameter(QZNumberParameter("About it.", required), name);
-  }
-  return description;
-}
-
-DescribedDiagnostic diagnosticWith(const std::string& name, const std::vector<std::pair<std::string, bool>>& experiment,
-                                   const std::vector<std::pair<std::string, bool>>& analysis) {
-  DescribedDiagnostic described;
-  described.diagnostic.name = name;
-  described.description.experiment = descriptionWith(experiment);
-  described.description.analysis = descriptionWith(analysis);
-  return described;
-}
-
-DescribedDiagnostic fault() {
-  return diagnosticWith("Fault", {{"frameCount", true}, {"timeout", true}}, {{"frameCount", true}});
-}
-DescribedDiagnostic sync() { return diagnosticWith("Sync.Back", {{"duration", true}}, {}); }
-DescribedDiagnostic relaxed() { return diagnosticWith("Relaxed", {{"gain", false}}, {}); }
-
-DescribedDiagnostic undescribed() {
-  DescribedDiagnostic described = diagnosticWith("Broken", {}, {});
-  described.description.error = hostError(HostErrorCode::kException, "it threw");
-  return described;
-}
-
-DescribedDiagnostic imagesAlone() {
-  DescribedDiagnostic described = diagnosticWith("Images", {{"images", true}, {"timeout", true}}, {});
-  described.diagnostic.experimentOnly = true;
-  described.diagnostic.usedBy = {"Fault", "Sync.Back"};
-  return described;
-}
-
-Profile profileWith(const std::string& diagnostics) {
-  return parseProfile("dir/some.json", R"({"schema": 1, "diagnostics": )" + diagnostics + "}");
-}
 
 std::vector<ParameterOverride> settings(const std::vector<std::string>& texts) {
   std::vector<ParameterOverride> parsed;
@@ -127,35 +87,6 @@ TEST(CheckSettings, SpeaksOfWhatIsSelected) {
   EXPECT_EQ(check("experiment.images=3", {imagesAlone()}), "accepted");
 }
 
-TEST(CheckProfile, ChecksTheEntriesOfExperimentsAgainstExperiments) {
-  const auto check = [](const std::string& experiments, bool allMustExist) {
-    Profile profile =
-        parseProfile("some.json", R"({"schema": 1, "diagnostics": {}, "experiments": )" + experiments + "}");
-    profile.mayNameOthers = !allMustExist;
-    return refusalOf(ExitCode::kCannotRead, [&] { checkProfile(profile, {sync(), imagesAlone()}); });
-  };
-  EXPECT_EQ(check(R"({"Im*": {"images": 5}})", true), "accepted");
-  EXPECT_EQ(
-      check(R"({"Images": {"image": 5}})", false),
-      "the profile 'some.json' sets 'image', but no experiment of 'Images' has that parameter; did you mean 'images'?");
-  EXPECT_EQ(check(R"({"Image": {"images": 5}})", true),
-            "the profile 'some.json' has an entry 'Image', which matches no experiment; did you mean 'Images'?");
-  EXPECT_EQ(check(R"({"Sync.Back": {"duration": 5}})", true),
-            "the profile 'some.json' has an entry 'Sync.Back', which matches no experiment");
-  EXPECT_EQ(check(R"({"Sync.Back": {"duration": 5}})", false), "accepted");
-}
-
-TEST(CheckProfile, NamesAnEntryOfTheDiagnosticsBeforeOneOfTheExperiments) {
-  const Profile profile = parseProfile(
-      "some.json",
-      R"({"schema": 1, "experiments": {"Image": {"images": 5}}, "diagnostics": {"Bakc": {"experiment": {"x": 3}}}})");
-  EXPECT_EQ(refusalOf(ExitCode::kCannotRead,
-                      [&] {
-                        checkProfile(profile, {sync(), imagesAlone()});
-                      }),
-            "the profile 'some.json' has an entry 'Bakc', which matches no diagnostic");
-}
-
 TEST(CheckSettings, SaysWhenADiagnosticsParametersAreNotKnown) {
   EXPECT_THAT(refusalOf(ExitCode::kUsage, [] { checkOverrides(settings({"x=3"}), {undescribed()}); }),
               HasSubstr("(Broken could not be described: it threw)"));
@@ -169,76 +100,6 @@ TEST(CheckSettings, RefusesTwoSettingsOfOneParameter) {
   EXPECT_THAT(check({"frameCount=3", "analysis.frameCount=4"}), HasSubstr("twice"));
   EXPECT_THAT(check({"experiment.frameCount=3", "experiment.frameCount=3"}), HasSubstr("twice"));
   EXPECT_EQ(check({"experiment.frameCount=3", "analysis.frameCount=4", "timeout=5"}), "accepted");
-}
-
-TEST(CheckProfile, RefusesAParameterThatNoDiagnosticOfTheEntryTakes) {
-  const auto check = [](const std::string& diagnostics) {
-    return refusalOf(ExitCode::kCannotRead, [&] {
-      checkProfile(profileWith(diagnostics), {sync(), fault(), undescribed()});
-    });
-  };
-  EXPECT_EQ(check(R"({"Sync.*": {"experiment": {"duraton": 3}}})"),
-            "the profile 'dir/some.json' sets 'duraton', but no experiment of 'Sync.*' has that parameter; did you "
-            "mean 'duration'?");
-  EXPECT_THAT(check(R"({"Sync.*": {"analysis": {"duration": 3}}})"), HasSubstr("no analysis of 'Sync.*' has"));
-  EXPECT_EQ(check(R"({"[SF]*": {"experiment": {"duration": 3, "timeout": 4}}})"), "accepted");
-  EXPECT_EQ(check(R"({"B*": {"experiment": {"anything": 3}}})"), "accepted");
-}
-
-TEST(CheckProfile, PassesOverAnEntryForSomethingThatWasNotDescribed) {
-  DescribedDiagnostic other = diagnosticWith("Sync.Front", {}, {});
-  other.description.isAsked = false;
-  const auto check = [&other](const std::string& diagnostics) {
-    return refusalOf(ExitCode::kCannotRead, [&] { checkProfile(profileWith(diagnostics), {sync(), other}); });
-  };
-  EXPECT_EQ(check(R"({"Sync.*": {"experiment": {"gain": 3}}})"), "accepted");
-  EXPECT_EQ(check(R"({"Sync.Front": {"experiment": {"gain": 3}}})"), "accepted");
-  EXPECT_THAT(check(R"({"Sync.Back": {"experiment": {"gain": 3}}})"), HasSubstr("sets 'gain'"));
-}
-
-TEST(DiagnosticsToDescribe, MightDeclareAParameterThatNothingDescribedDeclares) {
-  DescribedDiagnostic other = diagnosticWith("Sync.Front", {}, {});
-  other.description.isAsked = false;
-  DescribedDiagnostic alone = imagesAlone();
-  DescribedDiagnostic otherAlone = imagesAlone();
-  otherAlone.diagnostic.name = "Images.More";
-  otherAlone.description = {};
-  otherAlone.description.isAsked = false;
-  const std::vector<DescribedDiagnostic> catalogue = {sync(), other, undescribed(), alone, otherAlone};
-  struct Row {
-    const char* name;
-    const char* diagnostics;
-    const char* experiments;
-    std::vector<std::string> expected;
-  };
-  const Row rows[] = {
-      {"a parameter that is declared", R"({"Sync.*": {"experiment": {"duration": 3}}})", "{}", {}},
-      {"one that is not", R"({"Sync.*": {"experiment": {"gain": 3}}})", "{}", {"Sync.Front"}},
-      {"one of the other part", R"({"Sync.*": {"analysis": {"duration": 3}}})", "{}", {"Sync.Front"}},
-      {"two such entries",
-       R"({"Sync.*": {"experiment": {"gain": 3}}, "S*": {"experiment": {"gain": 3}}})",
-       "{}",
-       {"Sync.Front"}},
-      {"an entry for nothing that is asked", R"({"Sync.Front": {"experiment": {"gain": 3}}})", "{}", {}},
-      {"an entry for all, of which one cannot be described", R"({"*": {"experiment": {"gain": 3}}})", "{}", {}},
-      {"an experiment's parameter", "{}", R"({"Images*": {"gain": 3}})", {"Images.More"}},
-      {"an experiment's parameter that is declared", "{}", R"({"Images*": {"images": 3}})", {}},
-  };
-  for (const Row& row : rows) {
-    const Profile profile =
-        parseProfile("some.json", std::string(R"({"schema": 1, "diagnostics": )") + row.diagnostics +
-                                      R"(, "experiments": )" + row.experiments + "}");
-    EXPECT_EQ(namesOf(diagnosticsToDescribe(profile, catalogue)), row.expected) << row.name;
-  }
-}
-
-TEST(CheckProfile, RefusesAnEntryThatFitsNoDiagnosticOnlyWhenAllMustExist) {
-  Profile profile = profileWith(R"({"Sync.Bakc": {"experiment": {"duration": 3}}})");
-  EXPECT_EQ(
-      refusalOf(ExitCode::kCannotRead, [&] { checkProfile(profile, {sync()}); }),
-      "the profile 'dir/some.json' has an entry 'Sync.Bakc', which matches no diagnostic; did you mean 'Sync.Back'?");
-  profile.mayNameOthers = true;
-  EXPECT_EQ(refusalOf(ExitCode::kCannotRead, [&] { checkProfile(profile, {sync()}); }), "accepted");
 }
 
 TEST(BindParameters, LetsASettingWinOverTheProfile) {

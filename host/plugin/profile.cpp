@@ -14,18 +14,24 @@ namespace {
 
 constexpr std::uint64_t kSchema = 1;
 
-OrderedMap<Value> valuesOf(const JsonCursor& object) {
+constexpr std::string_view kDiagnostics = "diagnostics";
+constexpr std::string_view kExperiments = "experiments";
+
+OrderedMap<Value> valuesOf(const JsonCursor& object, FirstMistake& mistakes) {
   OrderedMap<Value> values;
-  for (const auto& [name, value] : object.entries()) {
-    if (!value.isNumber()) value.failType("a number");
-    values.set(name, value.scalar());
-  }
+  mistakes.of([&] {
+    mistakes.inOrder(object.entries(), [&values](const auto& entry) {
+      const auto& [name, value] = entry;
+      if (!value.isNumber()) value.failType("a number");
+      values.set(name, value.scalar());
+    });
+  });
   return values;
 }
 
-OrderedMap<Value> valuesIn(const JsonCursor& entry, std::string_view key) {
+OrderedMap<Value> valuesIn(const JsonCursor& entry, std::string_view key, FirstMistake& mistakes) {
   const std::optional<JsonCursor> object = entry.find(key);
-  return object ? valuesOf(*object) : OrderedMap<Value>();
+  return object ? valuesOf(*object, mistakes) : OrderedMap<Value>();
 }
 
 const Value* findIn(const std::vector<ProfileEntry>& entries, const std::string& name, Part part,
@@ -40,45 +46,74 @@ const Value* findIn(const std::vector<ProfileEntry>& entries, const std::string&
   return found;
 }
 
-UserLimit limitOf(const JsonCursor& entry, const std::string& diagnostic, const std::filesystem::path& file) {
-  entry.allowKeys({"limit", "name", "severity"});
-  const JsonCursor text = entry.at("limit");
+// The limit without its name and severity.
+UserLimit limitIn(const JsonCursor& cursor) {
+  const std::string text = cursor.text();
   UserLimit limit;
   try {
-    limit = parseUserLimit(text.text());
+    limit = parseUserLimit(text);
   } catch (const InputError& problem) {
-    text.fail(std::string("is not a limit: ") + problem.what() + ".");
+    cursor.fail(std::string("is not a limit: ") + problem.what() + ".");
   }
   if (!limit.diagnostic.empty())
-    text.fail("names a diagnostic, but a limit of a profile belongs to the diagnostics of its entry.");
-  limit.diagnostic = diagnostic;
-  if (const std::optional<JsonCursor> name = entry.find("name")) limit.name = name->text();
-  if (const std::optional<JsonCursor> severity = entry.find("severity")) {
-    constexpr std::string_view kNames[] = {"fail", "warn"};
-    limit.severity = *limitSeverityNamed(severity->oneOf(kNames, "a severity"));
-  }
-  limit.source = "profile " + file.filename().string();
-  limit.onlyIfSelected = true;
+    cursor.fail("names a diagnostic, but a limit of a profile belongs to the diagnostics of its entry.");
   return limit;
 }
 
-Profile profileOf(const std::filesystem::path& file, const JsonDocument& json) {
-  const JsonCursor document(json);
-  document.allowKeys({"schema", "diagnostics", "experiments"});
-  document.at("schema").integer(kSchema, kSchema);
+void addLimit(const std::string& diagnostic, const JsonCursor& entry, Profile& profile) {
+  FirstMistake& mistakes = profile.mistakes;
+  UserLimit limit;
+  mistakes.of([&] { entry.allowKeys({"limit", "name", "severity"}); });
+  mistakes.of([&] { limit = limitIn(entry.at("limit")); });
+  mistakes.of([&] {
+    if (const std::optional<JsonCursor> name = entry.find("name")) limit.name = name->text();
+  });
+  mistakes.of([&] {
+    constexpr std::string_view kNames[] = {"fail", "warn"};
+    const std::optional<JsonCursor> severity = entry.find("severity");
+    if (severity) limit.severity = *limitSeverityNamed(severity->oneOf(kNames, "a severity"));
+  });
+  limit.diagnostic = diagnostic;
+  limit.source = "profile " + profile.file.filename().string();
+  limit.onlyIfSelected = true;
+  profile.limits.push_back(std::move(limit));
+}
+
+void addEntry(const std::string& name, const JsonCursor& entry, Profile& profile) {
+  FirstMistake& mistakes = profile.mistakes;
+  mistakes.of([&] { entry.allowKeys({"experiment", "analysis", "limits"}); });
+  mistakes.of([&] {
+    profile.entries.push_back({name, valuesIn(entry, "experiment", mistakes), valuesIn(entry, "analysis", mistakes)});
+    const std::optional<JsonCursor> limits = entry.find("limits");
+    if (!limits) return;
+    mistakes.inOrder(limits->elements(), [&](const JsonCursor& one) { addLimit(name, one, profile); });
+  });
+}
+
+// Reads all that has the right form, and notes the first mistake.
+Profile profileOf(const std::filesystem::path& file, JsonDocument json) {
   Profile profile{file, {}};
-  for (const auto& [name, entry] : document.at("diagnostics").entries()) {
-    entry.allowKeys({"experiment", "analysis", "limits"});
-    profile.entries.push_back({name, valuesIn(entry, "experiment"), valuesIn(entry, "analysis")});
-    if (const std::optional<JsonCursor> limits = entry.find("limits")) {
-      for (const JsonCursor& one : limits->elements()) profile.limits.push_back(limitOf(one, name, file));
-    }
-  }
-  if (const std::optional<JsonCursor> experiments = document.find("experiments")) {
-    for (const auto& [name, values] : experiments->entries()) {
-      profile.experiments.push_back({name, valuesOf(values), {}});
-    }
-  }
+  profile.document = std::make_shared<const JsonDocument>(std::move(json));
+  FirstMistake& mistakes = profile.mistakes;
+  const JsonCursor document(*profile.document);
+  mistakes.of([&] { document.allowKeys({"schema", kDiagnostics, kExperiments}); });
+  mistakes.of([&] { document.at("schema").integer(kSchema, kSchema); });
+  mistakes.of([&] {
+    mistakes.inOrder(document.at(kDiagnostics).entries(),
+                     [&profile](const auto& entry) { addEntry(entry.first, entry.second, profile); });
+  });
+  mistakes.of([&] {
+    const std::optional<JsonCursor> experiments = document.find(kExperiments);
+    if (!experiments) return;
+    mistakes.inOrder(experiments->entries(), [&](const auto& entry) {
+      profile.experiments.push_back({entry.first, valuesOf(entry.second, mistakes), {}, true});
+    });
+  });
+  return profile;
+}
+
+Profile withoutMistakes(Profile profile) {
+  profile.mistakes.throwIfAny();
   return profile;
 }
 
@@ -99,10 +134,21 @@ const Value* Profile::findForExperiment(const std::string& experiment, const std
   return value;
 }
 
-Profile readProfile(const std::filesystem::path& file) { return profileOf(file, JsonDocument::read(file)); }
+std::string Profile::pathOf(const ProfileEntry& entry) {
+  return jsonPath(std::string(entry.ofExperiment ? kExperiments : kDiagnostics), entry.name);
+}
+
+std::string Profile::pathOf(const ProfileEntry& entry, Part part, std::string_view parameter) {
+  const std::string path = pathOf(entry);
+  return jsonPath(entry.ofExperiment ? path : jsonPath(path, nameOf(part)), parameter);
+}
+
+Profile readProfile(const std::filesystem::path& file) { return withoutMistakes(readProfileToCheck(file)); }
+
+Profile readProfileToCheck(const std::filesystem::path& file) { return profileOf(file, JsonDocument::read(file)); }
 
 Profile parseProfile(const std::filesystem::path& file, const std::string& text) {
-  return profileOf(file, JsonDocument(text, file.string()));
+  return withoutMistakes(profileOf(file, JsonDocument(text, file.string())));
 }
 
 }  // namespace quazor

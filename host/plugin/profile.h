@@ -17,11 +17,13 @@
 // its diagnostic; its name and its severity, "fail" by default, are optional.
 #pragma once
 
+#include "base/json/json_document.h"
 #include "contract/ordered_map.h"
 #include "contract/value.h"
 #include "host/limits/user_limit.h"
 
 #include <filesystem>
+#include <memory>
 #include <string>
 #include <vector>
 
@@ -29,6 +31,7 @@ namespace quazor {
 
 // The two parts of a diagnostic, each with its own parameters.
 enum class Part { kExperiment, kAnalysis };
+inline constexpr Part kParts[] = {Part::kExperiment, Part::kAnalysis};
 
 std::string_view nameOf(Part part);  // "experiment", "analysis"
 
@@ -36,6 +39,7 @@ struct ProfileEntry {
   std::string name;
   OrderedMap<Value> experiment;
   OrderedMap<Value> analysis;
+  bool ofExperiment = false;  // for an experiment that runs on its own
 
   const OrderedMap<Value>& values(Part part) const { return part == Part::kExperiment ? experiment : analysis; }
 };
@@ -47,6 +51,13 @@ struct Profile {
   std::string kind = "profile";             // a user-readable name of the kind of file
   std::vector<UserLimit> limits{};          // in the order of the file
   bool mayNameOthers = false;               // an entry may name a diagnostic that no loaded plug-in has
+  // The text of the file, for the lines of mistakes; null for values that do not come from a profile.
+  std::shared_ptr<const JsonDocument> document{};
+  FirstMistake mistakes{};  // of the form, if they were not thrown
+
+  // The path of an entry in the document, or of the value of one of its parameters.
+  static std::string pathOf(const ProfileEntry& entry);
+  static std::string pathOf(const ProfileEntry& entry, Part part, std::string_view parameter);
 
   // The value for a parameter, or null. The entry with the exact name of the diagnostic takes precedence over patterns,
   // and a later pattern over an earlier one. An entry without the parameter is skipped.
@@ -60,6 +71,10 @@ struct Profile {
 // Reads a profile of at most 16 MiB. Throws InputError with the file, the line and the place if it cannot be read or
 // does not have the form above.
 Profile readProfile(const std::filesystem::path& file);
+
+// Like readProfile(), but keeps mistakes of the form in Profile::mistakes, so that checkProfile() can throw the one
+// that comes first in the file. What is wrong is left out of the profile.
+Profile readProfileToCheck(const std::filesystem::path& file);
 
 // Like readProfile(), from the text of the file.
 Profile parseProfile(const std::filesystem::path& file, const std::string& text);

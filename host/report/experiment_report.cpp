@@ -2,8 +2,10 @@
 
 #include "contract/message_format.h"
 #include "host/report/sample_images.h"
+#include "host/text/display_width.h"
 #include "host/text/sample_picture.h"
 #include "host/text/table.h"
+#include "host/text/terminal.h"
 
 #include <algorithm>
 #include <cmath>
@@ -15,7 +17,6 @@ namespace quazor {
 
 namespace {
 
-constexpr std::size_t kWidth = 80;
 // Fewer samples are easier to read as numbers; more do not fit.
 constexpr std::size_t kMinDrawn = 8;
 constexpr std::size_t kMaxDrawn = 64;
@@ -34,13 +35,14 @@ std::string rangeOf(const Array& samples) {
   return formatMessage("min %@, max %@", *lowest, *highest);
 }
 
-// Prints `first` and then the items, separated by commas. Breaks lines at kWidth where possible.
-void printWrapped(std::ostream& out, const std::string& first, const std::vector<std::string>& items,
-                  const std::string& indent) {
+// Prints `first` and then the items, separated by commas. Breaks lines between items.
+void printItems(std::ostream& out, const std::string& first, const std::vector<std::string>& items,
+                const std::string& indent) {
+  const std::size_t columns = std::min(kWidestText, columnsOf(out));
   std::string line = indent + first;
   for (std::size_t i = 0; i < items.size(); ++i) {
     const std::string item = i + 1 < items.size() ? items[i] + "," : items[i];
-    if (line.size() + 1 + item.size() > kWidth) {
+    if (widthOf(line) + 1 + widthOf(item) > columns) {
       out << line << '\n';
       line = indent;
       line += "  ";
@@ -93,7 +95,7 @@ class AuxiliaryPrinter {
     for (const auto& [key, value] : image) {
       if (!isContainer(value)) items.push_back(printable(key) + " " + printable(defaultText(value)));
     }
-    printWrapped(out_, name + ":", items, indent);
+    printItems(out_, name + ":", items, indent);
     for (const auto& [key, value] : image) {
       if (isContainer(value)) printEntry(printable(key), value, indent + "  ");
     }
@@ -101,7 +103,7 @@ class AuxiliaryPrinter {
 
   void printSamples(const std::string& name, const Array& samples, const std::string& indent) const {
     out_ << indent << name << ": " << samples.size() << " samples, " << rangeOf(samples) << '\n';
-    if (samples.size() > kMaxDrawn) return;
+    if (samples.size() > kMaxDrawn || samples.size() + indent.size() > columnsOf(out_)) return;
     std::vector<double> numbers;
     numbers.reserve(samples.size());
     for (const Value& sample : samples) numbers.push_back(toDouble(&sample));
@@ -115,7 +117,7 @@ class AuxiliaryPrinter {
 void printMeasurements(std::ostream& out, const OrderedMap<Measurement>& measurements) {
   using Align = Table::Align;
   Table table({Align::kLeft, Align::kRight, Align::kLeft});
-  table.addRow({"Measurement", "Value", "Unit"});
+  table.addHeader({"Measurement", "Value", "Unit"});
   for (const auto& [name, measurement] : measurements) {
     table.addRow({printable(name), defaultText(measurement.value()), printable(measurement.unit().symbol())});
   }

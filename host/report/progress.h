@@ -2,8 +2,10 @@
 #pragma once
 
 #include "host/plugin/parameters.h"
+#include "host/text/terminal.h"
 
 #include <chrono>
+#include <cstddef>
 #include <cstdint>
 #include <functional>
 #include <optional>
@@ -20,9 +22,33 @@ struct ExpectedProgress {
 
 ExpectedProgress expectedProgressOf(const ResolvedParameters& parameters);
 
-// "Running NAME: 1.2 s of 3 s, 36 of 90 frames", without the parts that are unknown.
+// "Running NAME: 1.2 s of 3 s, 36 of 90 frames", without the parts that are unknown. The name is shortened if the text
+// takes more than `columns` columns.
 std::string progressText(const std::string& name, double elapsedSeconds, const ExpectedProgress& expected,
-                         std::optional<std::uint64_t> frames);
+                         std::optional<std::uint64_t> frames, std::size_t columns = kUnlimitedColumns);
+
+// A line on a terminal that the next one replaces. It is never so long that the terminal would wrap it.
+//
+// Thread: one at a time.
+class StatusLine {
+ public:
+  // `terminal` is borrowed; null shows nothing.
+  explicit StatusLine(std::ostream* terminal) : terminal_(terminal) {}
+  StatusLine(const StatusLine&) = delete;
+  StatusLine& operator=(const StatusLine&) = delete;
+  ~StatusLine() { erase(); }
+
+  bool isShown() const { return terminal_ != nullptr; }
+  // The number of columns for a text.
+  std::size_t columns() const;
+  // The text is shortened if it is too long.
+  void show(const std::string& text);
+  void erase();
+
+ private:
+  std::ostream* const terminal_;
+  bool isThere_ = false;
+};
 
 // Shows the progress in one terminal line, starting 0.3 seconds after the start of a run and erased at its end.
 //
@@ -30,12 +56,12 @@ std::string progressText(const std::string& name, double elapsedSeconds, const E
 class Progress {
  public:
   // `terminal` is borrowed; null shows nothing.
-  explicit Progress(std::ostream* terminal) : terminal_(terminal) {}
+  explicit Progress(std::ostream* terminal) : line_(terminal) {}
   Progress(const Progress&) = delete;
   Progress& operator=(const Progress&) = delete;
   ~Progress() { stop(); }
 
-  bool isShown() const { return terminal_ != nullptr; }
+  bool isShown() const { return line_.isShown(); }
   // REQUIRES: nothing is running.
   void start(const std::string& name, const ExpectedProgress& expected);
   // Sets the function that returns the number of frames, until stop(). Does nothing if nothing is running.
@@ -48,11 +74,8 @@ class Progress {
   void printAbove(const std::function<void()>& write);
 
  private:
-  void erase();
-
-  std::ostream* const terminal_;
+  StatusLine line_;
   bool running_ = false;
-  bool lineIsThere_ = false;
   std::string name_;
   ExpectedProgress expected_;
   std::function<std::uint64_t()> frames_;

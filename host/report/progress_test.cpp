@@ -53,6 +53,26 @@ TEST(ProgressText, ComparesElapsedWithExpected) {
   EXPECT_EQ(text("Name", 1, 1.7e300), "Running Name: 1 s of 1.7e+300 s");
 }
 
+TEST(ProgressText, ShortensTheNameIfTheTerminalIsNarrow) {
+  const auto text = [](std::size_t columns) { return progressText("CameraDiagnostic", 4.1, {10, 300}, 123, columns); };
+  EXPECT_EQ(text(58), "Running CameraDiagnostic: 4.1 s of 10 s, 123 of 300 frames");
+  EXPECT_EQ(text(57), "Running CameraDiagno...: 4.1 s of 10 s, 123 of 300 frames");
+  EXPECT_EQ(text(54), "Running CameraDia...: 4.1 s of 10 s, 123 of 300 frames");
+  EXPECT_EQ(text(53), "CameraDiagnostic: 4.1 s of 10 s, 123 of 300 frames");
+  EXPECT_EQ(text(40), "Cam...: 4.1 s of 10 s, 123 of 300 frames");
+}
+
+TEST(StatusLine, IsShorterThanTheTerminal) {
+  std::ostringstream terminal;
+  setColumns(terminal, 10);
+  StatusLine line(&terminal);
+  line.show("0123456789");
+  line.show("\u6D4B\u8BD5\u6D4B\u8BD5\u6D4B");
+  line.erase();
+  line.erase();
+  EXPECT_EQ(terminal.str(), "012345...\r\033[K\u6D4B\u8BD5\u6D4B...\r\033[K");
+}
+
 TEST(ProgressText, ComparesFramesOnlyWhenTheyAreExpectedAndCounted) {
   EXPECT_EQ(progressText("Name", 4.1, {10, 300}, 123), "Running Name: 4.1 s of 10 s, 123 of 300 frames");
   EXPECT_EQ(progressText("Name", 4.1, {std::nullopt, 300}, 0), "Running Name: 4.1 s, 0 of 300 frames");

@@ -10,6 +10,7 @@
 #include "host/report/ocp_report.h"
 #include "host/report/run_identity.h"
 #include "host/report/short_report.h"
+#include "host/text/display_width.h"
 #include "host/text/table.h"
 
 #include <algorithm>

@@ -4,6 +4,7 @@
 #include "host/report/text_report.h"
 #include "host/system/output_file.h"
 #include "host/text/table.h"
+#include "host/text/terminal.h"
 
 #include <algorithm>
 #include <utility>
@@ -57,7 +58,7 @@ void RunReport::finishRun(const RunEnded& event) {
     printEnd(console_.out, run_, records_, interrupted, options_.text, console_.colour);
   }
   if (!toFile && options_.format != Format::kText) {
-    console_.out << reportText(options_.format, run_, records_, interrupted);
+    writeUnfolded(console_.out, reportText(options_.format, run_, records_, interrupted));
   }
   console_.out.flush();
   if (interrupted && interrupted->empty()) {

@@ -3,8 +3,10 @@
 #include "contract/message_format.h"
 #include "host/model/limit_check.h"
 #include "host/report/text_report.h"
+#include "host/text/display_width.h"
 #include "host/text/shell_word.h"
 #include "host/text/table.h"
+#include "host/text/terminal.h"
 
 #include <algorithm>
 #include <sstream>
@@ -105,6 +107,7 @@ void printShortRecord(std::ostream& out, const DiagnosticRecord& record, bool co
   printVerdict(out, record, colour, resultCountsText(record), nameWidth);
   const bool passed = record.verdict == Verdict::kPass;
   std::ostringstream table;
+  prepareFor(out, table);
   printResults(table, record, ResultRows::kNoteworthy, colour);
   if (!passed) out << indentedLines(record.summary, "  ");
   if (record.verdict == Verdict::kError) out << '\n' << errorText(record.error, "  ");
@@ -126,9 +129,17 @@ void printFailures(std::ostream& out, const std::vector<DiagnosticRecord>& recor
     if (found != topics.end() && std::find(asked.begin(), asked.end(), *found) == asked.end()) asked.push_back(*found);
   }
   if (asked.empty()) return;
-  out << "Next: quazor explain";
-  for (const std::string& topic : asked) out << ' ' << shellWord(topic);
-  out << '\n';
+  const std::string command = "quazor explain";
+  std::string all = "Next: " + command;
+  for (const std::string& topic : asked) all += ' ' + shellWord(topic);
+  if (widthOf(all) <= columnsOf(out)) {
+    out << all << '\n';
+    return;
+  }
+  // A command that is broken into lines cannot be pasted.
+  std::string_view before = "Next: ";
+  for (const std::string& topic : asked)
+    out << std::exchange(before, "      ") << command << ' ' << shellWord(topic) << '\n';
 }
 
 }  // namespace quazor

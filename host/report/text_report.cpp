@@ -3,6 +3,7 @@
 #include "contract/message_format.h"
 #include "host/error/host_error.h"
 #include "host/model/limit_check.h"
+#include "host/text/display_width.h"
 #include "host/text/table.h"
 
 #include <algorithm>
@@ -87,7 +88,7 @@ void printHalf(std::ostream& out, std::string_view title, const std::string& nam
   }
   using Align = Table::Align;
   Table table({Align::kLeft, Align::kRight, Align::kLeft, Align::kLeft});
-  table.addRow({"Parameter", "Value", "From", "Meaning"});
+  table.addHeader({"Parameter", "Value", "From", "Meaning"});
   for (const ResolvedParameter& one : parameters) {
     const std::string unset = one.declaration.required() ? "not set, required" : "not set";
     table.addRow({printable(one.name), one.value ? defaultText(*one.value) : "-",
@@ -151,7 +152,7 @@ std::string_view errorStageText(const DiagnosticRecord& record) {
 void printResults(std::ostream& out, const DiagnosticRecord& record, ResultRows rows, bool colour) {
   using Align = Table::Align;
   Table table({Align::kLeft, Align::kRight, Align::kLeft, Align::kLeft, Align::kLeft});
-  table.addRow({"Result", "Value", "Unit", "Limit", "Verdict"});
+  table.addHeader({"Result", "Value", "Unit", "Limit", "Verdict"});
   const std::vector<LimitCheck> checks = limitChecksOf(record);
   bool empty = true;
   for (std::size_t i = 0; i < record.measuredResults.size(); ++i) {

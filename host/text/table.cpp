@@ -2,15 +2,20 @@
 
 #include "base/text/hexadecimal.h"
 #include "base/text/utf8.h"
+#include "host/text/display_width.h"
+#include "host/text/terminal.h"
 
 #include <algorithm>
+#include <numeric>
 #include <utility>
 
 namespace quazor {
 
 namespace {
 
-constexpr std::size_t kWidestLine = 80;
+constexpr std::size_t kGap = 2;               // between two columns
+constexpr std::string_view kNothing = "-";    // a cell without a value
+constexpr std::size_t kMinFoldedColumn = 16;  // a narrower one is hard to read
 
 bool isControl(unsigned char unit) { return unit < 0x20 || unit == 0x7F; }
 
@@ -65,12 +70,34 @@ std::string_view takeWord(std::string_view& text) {
   return word;
 }
 
-}  // namespace
-
-std::size_t widthOf(std::string_view text) {
-  return static_cast<std::size_t>(
-      std::count_if(text.begin(), text.end(), [](char unit) { return !continuesUtf8(unit); }));
+// The words of a cell are separated by blanks.
+std::size_t widestWordOf(std::string_view cell) {
+  std::size_t widest = 0;
+  while (!cell.empty()) {
+    const std::size_t end = std::min(cell.find(' '), cell.size());
+    widest = std::max(widest, widthOf(cell.substr(0, end)));
+    cell.remove_prefix(std::min(end + 1, cell.size()));
+  }
+  return widest;
 }
+
+// The cell in lines of at most `width` columns.
+std::vector<std::string> linesOf(const std::string& cell, std::size_t width) {
+  if (widthOf(cell) <= width) return {cell};
+  std::vector<std::string> lines;
+  std::string line;
+  for (std::string_view left = cell; !left.empty();) {
+    const std::string_view word = left.substr(0, std::min(left.find(' '), left.size()));
+    left.remove_prefix(std::min(word.size() + 1, left.size()));
+    if (!line.empty() && widthOf(line) + 1 + widthOf(word) > width) lines.push_back(std::exchange(line, {}));
+    if (!line.empty()) line += ' ';
+    line += word;
+  }
+  lines.push_back(std::move(line));
+  return lines;
+}
+
+}  // namespace
 
 std::string printable(std::string_view text) { return shownText(text, ""); }
 
@@ -92,14 +119,14 @@ std::string countText(std::size_t number, std::string_view what) {
   return std::to_string(number) + ' ' + std::string(what) + (number == 1 ? "" : "s");
 }
 
-std::string wrapped(std::string_view text, std::string_view first, std::string_view rest) {
+std::string wrapped(std::string_view text, std::string_view first, std::string_view rest, std::size_t columns) {
   const std::string shown = printable(text);
   std::string lines;
   std::string line(first);
   bool empty = true;  // `line` contains only its prefix
   for (std::string_view left = shown; !left.empty();) {
     const std::string_view word = takeWord(left);
-    if (!empty && widthOf(line) + 1 + widthOf(word) > kWidestLine) {
+    if (!empty && widthOf(line) + 1 + widthOf(word) > columns) {
       lines += line + '\n';
       line = rest;
       empty = true;
@@ -111,26 +138,110 @@ std::string wrapped(std::string_view text, std::string_view first, std::string_v
   return lines + line + '\n';
 }
 
+void printWrapped(std::ostream& out, std::string_view text, std::string_view first, std::string_view rest) {
+  const std::size_t columns = std::min(kWidestText, columnsOf(out));
+  out << (showsOnlyAscii(out) ? wrapped(asciiText(text), first, rest, columns) : wrapped(text, first, rest, columns));
+}
+
+void Table::addHeader(std::vector<std::string> cells) {
+  hasHeader_ = true;
+  rows_.insert(rows_.begin(), {std::move(cells), {}, {}});
+}
+
 void Table::addRow(std::vector<std::string> cells, std::string before, std::string after) {
   rows_.push_back({std::move(cells), std::move(before), std::move(after)});
 }
 
+Table Table::inAscii() const {
+  Table table = *this;
+  for (Row& row : table.rows_) {
+    for (std::string& cell : row.cells) cell = asciiText(cell);
+  }
+  return table;
+}
+
 void Table::print(std::ostream& out, std::string_view indent) const {
+  showsOnlyAscii(out) ? inAscii().printCells(out, indent) : printCells(out, indent);
+}
+
+void Table::printCells(std::ostream& out, std::string_view indent) const {
+  const std::size_t columns = columnsOf(out);
+  const std::size_t lost = indent.size() + kGap * (columns_.size() - 1);
+  const std::vector<std::size_t> widths = widthsWithin(columns > lost ? columns - lost : 0);
+  widths.empty() ? printBlocks(out, indent) : printAligned(out, indent, widths);
+}
+
+std::vector<std::size_t> Table::naturalWidths() const {
   std::vector<std::size_t> widths(columns_.size());
   for (const Row& row : rows_) {
     for (std::size_t i = 0; i < columns_.size(); ++i) widths[i] = std::max(widths[i], widthOf(row.cells[i]));
   }
-  for (const Row& row : rows_) {
-    std::string line(indent);
-    for (std::size_t i = 0; i < columns_.size(); ++i) {
-      const bool last = i + 1 == columns_.size();
-      const std::string padding(widths[i] - widthOf(row.cells[i]), ' ');
-      if (columns_[i] == Align::kRight) line += padding;
-      line += last ? row.before + row.cells[i] + row.after : row.cells[i];
-      if (columns_[i] == Align::kLeft && !last) line += padding;
-      if (!last) line += "  ";
+  return widths;
+}
+
+std::vector<std::size_t> Table::widthsWithin(std::size_t room) const {
+  std::vector<std::size_t> widths = naturalWidths();
+  std::size_t total = std::accumulate(widths.begin(), widths.end(), std::size_t{0});
+  if (total <= room) return widths;
+  std::vector<std::size_t> least = widths;
+  for (std::size_t i = 0; i < columns_.size(); ++i) {
+    if (columns_[i] == Align::kRight) continue;
+    std::size_t word = 0;
+    for (const Row& row : rows_) word = std::max(word, widestWordOf(row.cells[i]));
+    least[i] = std::min(widths[i], std::max(word, kMinFoldedColumn));
+  }
+  if (std::accumulate(least.begin(), least.end(), std::size_t{0}) > room) return {};
+  while (total > room) {  // the column that can give most gives first
+    std::size_t giver = 0;
+    for (std::size_t i = 1; i < widths.size(); ++i) {
+      if (widths[i] - least[i] > widths[giver] - least[giver]) giver = i;
     }
-    out << line << '\n';
+    --widths[giver];
+    --total;
+  }
+  return widths;
+}
+
+void Table::printAligned(std::ostream& out, std::string_view indent, const std::vector<std::size_t>& widths) const {
+  for (const Row& row : rows_) {
+    std::vector<std::vector<std::string>> cells;  // each in its lines
+    std::size_t height = 1;
+    for (std::size_t i = 0; i < columns_.size(); ++i) {
+      cells.push_back(linesOf(row.cells[i], widths[i]));
+      height = std::max(height, cells.back().size());
+    }
+    for (std::size_t at = 0; at < height; ++at) {
+      std::string line(indent);
+      for (std::size_t i = 0; i < columns_.size(); ++i) {
+        const bool last = i + 1 == columns_.size();
+        const std::string cell = at < cells[i].size() ? cells[i][at] : std::string();
+        const std::string padding(widths[i] - widthOf(cell), ' ');
+        if (columns_[i] == Align::kRight && !cell.empty()) line += padding;
+        line += last && !cell.empty() ? row.before + cell + row.after : cell;
+        if (!last && (columns_[i] == Align::kLeft || cell.empty())) line += padding;
+        if (!last) line += std::string(kGap, ' ');
+      }
+      if (height > 1) line.erase(line.find_last_not_of(' ') + 1);
+      out << line << '\n';
+    }
+  }
+}
+
+void Table::printBlocks(std::ostream& out, std::string_view indent) const {
+  const std::vector<std::string> noNames(columns_.size());
+  const std::vector<std::string>& names = hasHeader_ ? rows_.front().cells : noNames;
+  std::size_t width = 0;
+  for (std::size_t i = 1; i < names.size(); ++i) width = std::max(width, widthOf(names[i]));
+  const std::string below = std::string(indent) + "  ";
+  for (std::size_t at = hasHeader_ ? 1 : 0; at < rows_.size(); ++at) {
+    const Row& row = rows_[at];
+    out << indent << row.cells.front() << '\n';
+    for (std::size_t i = 1; i < columns_.size(); ++i) {
+      if (row.cells[i].empty() || row.cells[i] == kNothing) continue;
+      const std::string name = hasHeader_ ? names[i] + std::string(width - widthOf(names[i]) + kGap, ' ') : "";
+      const bool last = i + 1 == columns_.size();
+      out << below << name << (last ? row.before + row.cells[i] + row.after : row.cells[i]) << '\n';
+    }
   }
 }
 

@@ -1,0 +1,218 @@
+"""What the program prints on terminals of several widths: no line is wider than its terminal, and nothing is lost."""
+
+import fcntl
+import os
+import pty
+import re
+import select
+import shlex
+import shutil
+import signal
+import struct
+import subprocess
+import tempfile
+import termios
+import time
+import unicodedata
+import unittest
+
+from command_line_fixture import PROGRAM, RecordTest, quazor
+
+WIDTHS = (40, 80, 200)
+DROPPED = "camera_sync/frames_dropped"
+CSI = re.compile(r"\x1b\[[0-9;]*([A-Za-z])")
+UTF8 = {"LC_ALL": "C.UTF-8"}
+PLAIN = {"LC_ALL": "C"}
+
+
+def width_of(text):
+    """The columns of a text, by the tables of this interpreter."""
+    width = 0
+    for character in CSI.sub("", text):
+        if unicodedata.category(character) not in ("Mn", "Me"):
+            width += 2 if unicodedata.east_asian_width(character) in "WF" else 1
+    return width
+
+
+def lines_on_screen(output):
+    """Every line that was on the terminal, including progress lines that were erased later."""
+    text = output.decode("utf-8", "surrogateescape").replace("\r\n", "\n")
+    return [part for line in text.split("\n") for part in line.split("\r")]
+
+
+class Terminal:
+    """A pseudoterminal of a given width, and a program in it."""
+
+    def __init__(self, columns, *arguments, env=None, separate_output=False):
+        self.master, slave = pty.openpty()
+        self.resize(columns)
+        environment = {**os.environ, "TERM": "xterm", **(env or UTF8)}
+        environment.pop("COLUMNS", None)
+        out = subprocess.PIPE if separate_output else slave
+        self.process = subprocess.Popen([PROGRAM, *map(str, arguments)], stdin=slave, stdout=out, stderr=slave,
+                                        env=environment, start_new_session=True)
+        os.close(slave)
+
+    def resize(self, columns):
+        fcntl.ioctl(self.master, termios.TIOCSWINSZ, struct.pack("HHHH", 24, columns, 0, 0))
+
+    def read_for(self, seconds, until=None):
+        """What is printed until the program closes the terminal, the time is over or `until` appears."""
+        output = b""
+        end = time.monotonic() + seconds
+        while time.monotonic() < end and not (until and until in output):
+            if not select.select([self.master], [], [], 0.1)[0]:
+                continue
+            try:
+                piece = os.read(self.master, 65536)
+            except OSError:  # the program has closed it
+                break
+            if not piece:
+                break
+            output += piece
+        return output
+
+    def finish(self):
+        output = self.read_for(120)
+        code = self.process.wait(60)
+        os.close(self.master)
+        return code, output
+
+
+def on_terminal(columns, *arguments, env=None):
+    return Terminal(columns, *arguments, env=env).finish()
+
+
+def squeezed(text):
+    return re.sub(r"\s", "", CSI.sub("", text))
+
+
+class TerminalWidthTest(RecordTest):
+    def commands(self):
+        record = self.recorded()
+        other = self.directory / "other.jsonl"
+        self.recorded("--set", "duration=2", record=other, duration=None)
+        files = self.directory / "records"
+        files.mkdir()
+        for name in ("one", "two_with_a_name_that_is_longer_than_forty_columns"):
+            shutil.copy(record, files / f"{name}.jsonl")
+        (files / "broken.jsonl").write_text(record.read_text().replace('"pass"', '"fail"'))
+        return [
+            [], ["--help"], ["run", "--help"], ["selftest", "--help"], ["phone", "--help"], ["list"],
+            ["list", "--plugin", "sensor_images"],
+            ["describe", "*"], ["run", "--all"], ["run", "--all", "--verbose"],
+            ["run", "--all", "--phone", DROPPED, "--profile", "strict"],
+            ["run", "--all", "--phone", DROPPED, "--profile", "strict", "--verbose"],
+            ["run", "--all", "--phone", "camera_sync/start_refused_on_first"],
+            ["run", "--all", "--skip", "Camera*=the cameras of this phone are with a colleague in another building"],
+            ["run", "CameraSyncDiagnostic.Back", "--log-level", "debug"],
+            ["experiment", "NimbeImageExperiment", "--plugin", "sensor_images", "--set", "imagesRequested=1"],
+            ["experiment", "CameraSyncExperiment.Back"],
+            ["explain"], ["explain", "BackTele.Total"], ["explain", "QZCapturePlugInErrorDomain:206"],
+            ["selftest", DROPPED, "healthy"], ["doctor"], ["verify", record], ["verify", files],
+            ["diff", record, other], ["run", "nothing"], ["lst"], ["run", "--limit", "x", "--all"],
+        ]
+
+    def test_no_line_is_wider_than_the_terminal(self):
+        for arguments in self.commands():
+            for columns in WIDTHS:
+                for env in (UTF8, PLAIN):
+                    with self.subTest(arguments=arguments, columns=columns, env=env):
+                        code, output = on_terminal(columns, *arguments, env=env)
+                        self.assertLess(code, 70, output)
+                        self.assertGreaterEqual(code, 0, output)
+                        self.assertTrue(output)
+                        for line in lines_on_screen(output):
+                            self.assertLessEqual(width_of(line), columns, line)
+                        if env is PLAIN:
+                            self.assertTrue(output.isascii(), output)
+
+    def test_nothing_is_lost_on_a_narrow_terminal(self):
+        # Names, numbers and limits are there, whatever the layout. A block needs neither a heading for its first line
+        # nor cells without a value.
+        left_out = {"-", "Parameter", "Result", "Phone", "Run"}
+        for arguments in (["list"], ["describe", "*"], ["run", "--all", "--verbose"],
+                          ["run", "--all", "--phone", DROPPED, "--profile", "strict", "--verbose"],
+                          ["explain"], ["explain", "BackTele.Total"], ["selftest", DROPPED, "healthy"], ["doctor"],
+                          ["run", "--help"]):
+            with self.subTest(arguments):
+                wide = quazor(*arguments).stdout
+                narrow = squeezed(on_terminal(40, *arguments)[1].decode())
+                for word in wide.split():
+                    if word not in left_out:
+                        self.assertIn(word, narrow)
+
+    def test_a_pipe_has_no_width(self):
+        for columns in ("40", "200"):
+            result = quazor("run", "--all", "--verbose", env={"COLUMNS": columns})
+            self.assertIn("  Number Vok INT_FAULT_STROBE_SHORT_LATCH          0  events  Limit: = 0              pass\n",
+                          result.stdout)
+        self.assertTrue(any(len(line) > 80 for line in quazor("--help").stdout.splitlines()))
+
+    def test_output_for_programs_is_not_folded(self):
+        for arguments in (["list", "--format", "json"], ["run", "--all", "--format", "json"],
+                          ["run", "--all", "--format", "csv"], ["describe", "*", "--format", "json"],
+                          ["completion", "bash"]):
+            with self.subTest(arguments):
+                code, output = on_terminal(40, *arguments)
+                self.assertEqual(code, 0)
+                text = "".join(line + "\n" for line in output.decode().replace("\r\n", "\n").split("\n")[:-1])
+                text = re.sub(r"Running [^\r]*|\r\x1b\[K", "", text)
+                piped = quazor(*arguments).stdout
+                # Identities and times differ between two runs, but not the number of lines.
+                self.assertEqual(text.count("\n"), piped.count("\n"))
+
+    def test_wide_characters_count_twice(self):
+        scenario = self.phone.read_text().replace("One camera", "\u76f8\u673a\u6d4b\u8bd5" * 12 + " e\u0301" * 30)
+        phone = self.write("wide.json", scenario)
+        limit = "Count >= -1"
+        profile = self.write("wide_limit.json", '{"schema": 1, "diagnostics": {"Fake.One": {"limits": [{"limit": "'
+                             + limit + '", "name": "' + "\u6bcf\u4e2a" * 20 + " e\u0301\u0300" * 9 + '"}]}}}')
+        for columns in WIDTHS:
+            for env in (UTF8, PLAIN):
+                code, output = on_terminal(
+                    columns, "run", "Fake.One", "--plugin", os.environ["QUAZOR_TEST_PLUGINS"] + "/working_plugin.so",
+                    "--phone", phone, "--profile", "none", "--set", "duration=1", "--parameters", profile, env=env)
+                self.assertEqual(code, 0, output)
+                for line in lines_on_screen(output):
+                    self.assertLessEqual(width_of(line), columns, line)
+                if env is UTF8:
+                    self.assertEqual(squeezed(output.decode()).count("\u6bcf\u4e2a"), 20)
+                else:
+                    self.assertIn(b"\\xe6\\xaf\\x8f", output)
+
+    def test_progress_shortens_the_name_and_keeps_the_numbers(self):
+        arguments = ["run", "CameraSyncDiagnostic.Back", "--realtime", "--set", "duration=2"]
+        code, output = on_terminal(40, *arguments)
+        self.assertEqual(code, 0, output)
+        progress = [line for line in lines_on_screen(output) if " s of 2 s" in line]
+        self.assertTrue(progress, output)
+        for line in progress:
+            self.assertLess(width_of(line), 40)
+        self.assertRegex(output.decode(), r"Running CameraSyncDiag\.\.\.: [0-9.]+ s of 2 s")
+        self.assertRegex(on_terminal(80, *arguments)[1].decode(), r"Running CameraSyncDiagnostic\.Back: [0-9.]+ s of 2 s")
+
+    def test_a_terminal_may_change_its_width_during_a_run(self):
+        terminal = Terminal(80, "run", "CameraSyncDiagnostic.Back", "--realtime", "--set", "duration=3", "--verbose")
+        before = terminal.read_for(30, until=b"Running CameraSyncDiagnostic.Back: ")
+        terminal.resize(40)
+        os.killpg(terminal.process.pid, signal.SIGWINCH)
+        time.sleep(0.3)
+        skipped = terminal.read_for(0.2)
+        code, output = terminal.finish()
+        self.assertEqual(code, 0, before + skipped + output)
+        for line in lines_on_screen(output):
+            self.assertLessEqual(width_of(line), 40, line)
+        self.assertIn("PASS", output.decode())
+
+    def test_the_command_to_type_next_is_never_broken(self):
+        _, output = on_terminal(40, "run", "--all", "--phone", DROPPED, "--profile", "strict")
+        end = CSI.sub("", output.decode()).replace("\r\n", "\n").splitlines()[-2:]
+        self.assertEqual(end, ["Next: quazor explain BackTele.Total", "      quazor explain FrontInfrared.Total"])
+        for line in end:
+            command = shlex.split(line.removeprefix("Next: "))
+            self.assertEqual(quazor(*command[1:]).returncode, 0)
+
+
+if __name__ == "__main__":
+    unittest.main()

@@ -1,0 +1,129 @@
+#include "host/plugin/profile_check.h"
+
+#include "base/json/json_cursor.h"
+#include "host/error/exit_code.h"
+
+#include <algorithm>
+#include <iterator>
+#include <optional>
+#include <string>
+#include <string_view>
+
+namespace quazor {
+
+namespace {
+
+bool isAmong(const std::vector<std::string>& names, const std::string& name) {
+  return std::find(names.begin(), names.end(), name) != names.end();
+}
+
+// "; did you mean ...?" or "; expected one of ...", the end of a sentence about an unknown name.
+std::string suggestionFor(const std::string& name, const std::vector<std::string>& names) {
+  std::vector<std::string_view> known;
+  for (const std::string& one : names) {
+    if (std::find(known.begin(), known.end(), one) == known.end()) known.push_back(one);
+  }
+  return suggestion(name, known);
+}
+
+// Throws the sentence about a path of the profile, as a mistake of its file if it has one.
+[[noreturn]] void fail(const Profile& profile, const std::string& path, const std::string& sentence) {
+  if (profile.document != nullptr) profile.document->fail(path, sentence, path);
+  throw CommandError(ExitCode::kCannotRead,
+                     "the " + profile.kind + " '" + profile.file.string() + "': " + sentenceAbout(path, sentence));
+}
+
+void checkParameters(const Profile& profile, const ProfileEntry& entry, Part part,
+                     const std::vector<DescribedDiagnostic>& matched) {
+  const std::vector<std::string> names = declaredNames(matched, part);
+  for (const auto& [name, ignored] : entry.values(part)) {
+    if (isAmong(names, name)) continue;
+    fail(profile, Profile::pathOf(entry, part, name),
+         "no " + std::string(nameOf(part)) + " of " + inQuotes(entry.name) + " has this parameter" +
+             suggestionFor(name, names));
+  }
+}
+
+// The diagnostics or experiments that the entry matches.
+std::vector<DescribedDiagnostic> matchesOf(const ProfileEntry& entry,
+                                           const std::vector<DescribedDiagnostic>& catalogue) {
+  std::vector<DescribedDiagnostic> matched;
+  for (const DescribedDiagnostic& one : catalogue) {
+    const bool fits = matchesName(entry.name, one.diagnostic.name);
+    if (fits && one.diagnostic.experimentOnly == entry.ofExperiment) matched.push_back(one);
+  }
+  return matched;
+}
+
+[[noreturn]] void failUnmatched(const Profile& profile, const ProfileEntry& entry,
+                                const std::vector<DescribedDiagnostic>& catalogue) {
+  std::vector<std::string> names;
+  for (const DescribedDiagnostic& one : catalogue) {
+    if (one.diagnostic.experimentOnly == entry.ofExperiment) names.push_back(one.diagnostic.name);
+  }
+  const std::string noun = entry.ofExperiment ? "experiment" : "diagnostic";
+  fail(profile, Profile::pathOf(entry),
+       "no " + noun + (isPattern(entry.name) ? " matches this pattern" : " has this name") +
+           suggestionFor(entry.name, names));
+}
+
+void checkEntry(const Profile& profile, const ProfileEntry& entry, const std::vector<DescribedDiagnostic>& catalogue,
+                FirstMistake& mistakes) {
+  const std::vector<DescribedDiagnostic> matched = matchesOf(entry, catalogue);
+  if (matched.empty() && !profile.mayNameOthers) failUnmatched(profile, entry, catalogue);
+  const bool allDescribed = std::all_of(matched.begin(), matched.end(), [](const DescribedDiagnostic& one) {
+    return one.description.isAsked && one.description.error == nullptr;
+  });
+  if (matched.empty() || !allDescribed) return;
+  for (const Part part : kParts) mistakes.of([&] { checkParameters(profile, entry, part, matched); });
+}
+
+// True if one of the diagnostics declares each parameter that the entry sets.
+bool declareAll(const std::vector<DescribedDiagnostic>& diagnostics, const ProfileEntry& entry) {
+  for (const Part part : kParts) {
+    const std::vector<std::string> names = declaredNames(diagnostics, part);
+    for (const auto& [name, ignored] : entry.values(part)) {
+      if (!isAmong(names, name)) return false;
+    }
+  }
+  return true;
+}
+
+// Adds the undescribed matches if the described ones do not declare every parameter of the entry.
+void addDiagnosticsToDescribe(const ProfileEntry& entry, const std::vector<DescribedDiagnostic>& catalogue,
+                              std::vector<Diagnostic>& undescribed) {
+  const std::vector<DescribedDiagnostic> matched = matchesOf(entry, catalogue);
+  std::vector<DescribedDiagnostic> asked;
+  std::copy_if(matched.begin(), matched.end(), std::back_inserter(asked),
+               [](const DescribedDiagnostic& one) { return one.description.isAsked; });
+  const auto couldNot = [](const DescribedDiagnostic& one) { return one.description.error != nullptr; };
+  // An entry that matches nothing selected does not matter. checkProfile skips an entry with a failed description.
+  if (asked.empty() || std::any_of(asked.begin(), asked.end(), couldNot) || declareAll(asked, entry)) return;
+  for (const DescribedDiagnostic& one : matched) {
+    if (!one.description.isAsked && !contains(undescribed, one.diagnostic)) undescribed.push_back(one.diagnostic);
+  }
+}
+
+}  // namespace
+
+void checkProfile(const Profile& profile, const std::vector<DescribedDiagnostic>& catalogue) {
+  FirstMistake mistakes = profile.mistakes;
+  const auto check = [&](const ProfileEntry& entry) { checkEntry(profile, entry, catalogue, mistakes); };
+  mistakes.inOrder(profile.entries, check);
+  mistakes.inOrder(profile.experiments, check);
+  try {
+    mistakes.throwIfAny();
+  } catch (const DocumentError& first) {
+    throw CommandError(ExitCode::kCannotRead, first.what());
+  }
+}
+
+std::vector<Diagnostic> diagnosticsToDescribe(const Profile& profile,
+                                              const std::vector<DescribedDiagnostic>& catalogue) {
+  std::vector<Diagnostic> undescribed;
+  for (const ProfileEntry& entry : profile.entries) addDiagnosticsToDescribe(entry, catalogue, undescribed);
+  for (const ProfileEntry& entry : profile.experiments) addDiagnosticsToDescribe(entry, catalogue, undescribed);
+  return undescribed;
+}
+
+}  // namespace quazor

@@ -1,0 +1,21 @@
+// Checks profiles against the diagnostics and experiments that are loaded.
+#pragma once
+
+#include "host/plugin/parameters.h"
+#include "host/plugin/profile.h"
+
+#include <vector>
+
+namespace quazor {
+
+// Throws a CommandError (kCannotRead) for the first mistake in the order of the file: one of the form, an entry that
+// sets a parameter that no matching diagnostic or experiment declares or, unless the profile may name others, an entry
+// that matches none. Skips an entry if anything that it matches was not described.
+void checkProfile(const Profile& profile, const std::vector<DescribedDiagnostic>& catalogue);
+
+// The undescribed diagnostics that must be described before checkProfile can check an entry: those that match an entry
+// with a parameter that no described match declares.
+std::vector<Diagnostic> diagnosticsToDescribe(const Profile& profile,
+                                              const std::vector<DescribedDiagnostic>& catalogue);
+
+}  // namespace quazor
