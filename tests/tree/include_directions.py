@@ -56,7 +56,7 @@ ALLOWED = {
                         SIMULATED + "scenario"],
     LINUX + "system": [*CONTRACT, "backends/log", "backends/threads"],
     LINUX + "binding": [*CONTRACT, "backends/faults", "base/json", "base/text"],
-    LINUX + "video": [*CONTRACT, LINUX + "binding", LINUX + "system"],
+    LINUX + "video": [*CONTRACT, "base/text", LINUX + "binding", LINUX + "system"],
     LINUX + "capture": [*CONTRACT, "backends/capture", LINUX + "binding", LINUX + "system", LINUX + "video"],
     LINUX + "hid": [*CONTRACT, "backends/hid", "base/text", LINUX + "system"],
     LINUX + "counters": [*CONTRACT, "backends/counters", LINUX + "binding", LINUX + "system"],
