@@ -89,8 +89,9 @@ void removeMarks(RawOptions& raw) {
         &raw.outputs, &raw.deadlines, &raw.choice.except, &raw.choice.skips}) {
     std::for_each(texts->begin(), texts->end(), removeMark);
   }
-  for (std::string* text : {&raw.profile, &raw.phone, &raw.record, &raw.of, &raw.seed, &raw.seeds, &raw.memory,
-                            &raw.logLimit, &raw.grace, &raw.choice.settle}) {
+  for (std::string* text :
+       {&raw.profile, &raw.phone, &raw.record, &raw.of, &raw.seed, &raw.seeds, &raw.memory, &raw.logLimit, &raw.grace,
+        &raw.choice.settle, &raw.choice.attempts, &raw.choice.repetitions}) {
     removeMark(*text);
   }
 }
@@ -171,14 +172,6 @@ void addLimits(CLI::App& command, RawOptions& raw) {
                 "[DIAGNOSTIC:]RESULT OP NUMBER [UNIT] [+- TOLERANCE]");
 }
 
-void addLogLimit(CLI::App& command, RawOptions& raw) {
-  command
-      .add_option("--log-limit", raw.logLimit,
-                  "Keep at most this many log lines of each diagnostic, and this much of their text; the number of "
-                  "lines left out is logged at its end. Default 1000000,64")
-      ->type_name("LINES[,MEBIBYTES]|none");
-}
-
 void addLogOptions(CLI::App& command, RawOptions& raw) {
   command
       .add_option("--log-level", raw.logLevel,
@@ -186,7 +179,7 @@ void addLogOptions(CLI::App& command, RawOptions& raw) {
                   "reports. Without this option, errors are printed and reports include default")
       ->type_name("LEVEL")
       ->check(CLI::IsMember({"error", "default", "debug"}));
-  addLogLimit(command, raw);
+  addLogLimit(command, raw.logLimit);
   command.add_flag("--system-log", raw.systemLog,
                    "Also send log lines to the systemd journal, or to syslog if there is no journal");
 }
@@ -282,8 +275,9 @@ void checkNames(const Options& options, const std::string& what) {
 }
 
 Options optionsOf(const CLI::App& command, const RawOptions& raw) {
-  for (const char* option : {"--plugin", "--output", "--profile", "--parameters", "--phone", "--record", "--of",
-                             "RECORD", "--memory", "--log-limit", "--grace", "--settle", "--except", "--skip"}) {
+  for (const char* option :
+       {"--plugin", "--output", "--profile", "--parameters", "--phone", "--record", "--of", "RECORD", "--memory",
+        "--log-limit", "--grace", "--settle", "--except", "--skip", "--attempts", "--repeat"}) {
     refuseEmpty(command, option);
   }
   Options options;
@@ -401,8 +395,11 @@ void declareOtherCommands(CLI::App& app, RawOptions& raw) {
       ->type_name("");
   addReportOptions(explain, raw, {"text", "json"});
   CLI::App& doctor =
-      *app.add_subcommand("doctor", "Check the installation: plug-ins, profile, phones, bindings, last record");
+      *app.add_subcommand("doctor",
+                          "Check the installation: plug-ins, profile, phones, bindings, last record. With --plugin, "
+                          "judge that plug-in instead: names, summaries, results, explanations, phones, cost");
   addPlugins(doctor, raw);
+  addParameterOptions(doctor, raw);
   addProcessOptions(doctor, raw);
   CLI::App& selftest = *app.add_subcommand(
       "selftest", "Run the diagnostics on the installed simulated phones and report which faults they detect");
@@ -413,7 +410,7 @@ void declareOtherCommands(CLI::App& app, RawOptions& raw) {
   addReportOptions(selftest, raw, {"text", "json"});
   addProcessOptions(selftest, raw);
   addGrace(selftest, raw);
-  addLogLimit(selftest, raw);
+  addLogLimit(selftest, raw.logLimit);
   CLI::App& phone =
       *app.add_subcommand("phone", "Find the devices of this machine and print a starter binding for them");
   phone.add_option("WHAT", raw.names, "probe")->type_name("")->required()->expected(1)->check(CLI::IsMember({"probe"}));

@@ -4,6 +4,8 @@
 #include "contract/lab.h"
 #include "contract/parameter_range.h"
 
+#include <chrono>
+#include <cstdint>
 #include <filesystem>
 #include <optional>
 #include <string>
@@ -26,6 +28,12 @@ struct Diagnostic {
   std::vector<std::filesystem::path> plugins{};
 };
 
+// The time that something took in a process, and the memory by which the process grew.
+struct Cost {
+  std::chrono::nanoseconds time{};
+  std::uint64_t bytes = 0;
+};
+
 // The descriptions of a diagnostic's experiment and analysis.
 struct DiagnosticDescription {
   QZDescription experiment{""};
@@ -35,6 +43,15 @@ struct DiagnosticDescription {
   // What the parameters accept, where it is known.
   OrderedMap<QZParameterRange> experimentRanges{};
   OrderedMap<QZParameterRange> analysisRanges{};
+  std::optional<Cost> cost{};  // of asking; nothing if it was not measured
+};
+QZDescription analysis{""};
+DiagnosticErrorPtr error;    // why there is no description; null if there is one
+bool isAsked = true;         // false if no description was requested; all other members are then empty
+std::optional<Cost> cost{};  // of asking; nothing if it was not measured
+// What the parameters accept, where it is known.
+OrderedMap<QZParameterRange> experimentRanges{};
+OrderedMap<QZParameterRange> analysisRanges{};
 };
 
 // What the names of a command refer to. kDescribable includes the experiments of diagnostics only if they are requested
