@@ -45,13 +45,6 @@ struct DiagnosticDescription {
   OrderedMap<QZParameterRange> analysisRanges{};
   std::optional<Cost> cost{};  // of asking; nothing if it was not measured
 };
-QZDescription analysis{""};
-DiagnosticErrorPtr error;    // why there is no description; null if there is one
-bool isAsked = true;         // false if no description was requested; all other members are then empty
-std::optional<Cost> cost{};  // of asking; nothing if it was not measured
-// What the parameters accept, where it is known.
-OrderedMap<QZParameterRange> experimentRanges{};
-OrderedMap<QZParameterRange> analysisRanges{};
 };
 
 // What the names of a command refer to. kDescribable includes the experiments of diagnostics only if they are requested
