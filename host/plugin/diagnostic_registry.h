@@ -45,7 +45,6 @@ struct DiagnosticDescription {
   OrderedMap<QZParameterRange> analysisRanges{};
   std::optional<Cost> cost{};  // of asking; nothing if it was not measured
 };
-};
 
 // What the names of a command refer to. kDescribable includes the experiments of diagnostics only if they are requested
 // by name or by a pattern that matches nothing else, because the descriptions of the diagnostics already contain them.
