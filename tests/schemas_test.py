@@ -32,6 +32,7 @@ RUNS = (
      "--log-level", "debug"],
     ["run", "CameraSyncDiagnostic.*", "--phone", "camera_sync/start_refused_on_first", "--limit", "Nothing > 1"],
     ["run", "CameraSyncDiagnostic.Back", "--limit", "*.Total in [90, 90]"],
+    ["run", "CameraSyncDiagnostic.Back", "--realtime", "--set", "duration=2", "--heartbeat", "1"],
     ["experiment", "--all"],
     ["run", "--all", "--skip", "Tessel*=they are not needed"],
     ["experiment", "NimbeImageExperiment", "--plugin", SENSOR_IMAGES],

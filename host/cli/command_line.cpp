@@ -40,6 +40,8 @@ struct RawOptions {
   std::string seeds = "3";
   std::string memory;
   std::string grace;
+  std::string heartbeat = "30";
+  std::string what;
   std::string logLevel;
   std::string logLimit;
   std::string format = "text";
@@ -90,7 +92,7 @@ void removeMarks(RawOptions& raw) {
     std::for_each(texts->begin(), texts->end(), removeMark);
   }
   for (std::string* text : {&raw.profile, &raw.phone, &raw.record, &raw.of, &raw.seed, &raw.seeds, &raw.memory,
-                            &raw.logLimit, &raw.grace, &raw.choice.settle}) {
+                            &raw.logLimit, &raw.grace, &raw.heartbeat, &raw.what, &raw.choice.settle}) {
     removeMark(*text);
   }
 }
@@ -132,6 +134,15 @@ void addGrace(CLI::App& command, RawOptions& raw) {
   command
       .add_option("--grace", raw.grace,
                   "How long a setup or run may still take after an interrupt, before its teardown; default 5")
+      ->type_name("SECONDS");
+}
+
+void addHeartbeat(CLI::App& command, RawOptions& raw) {
+  command
+      .add_option(
+          "--heartbeat", raw.heartbeat,
+          "How often a run says on standard error that it goes on, unless that is a terminal, and in its record; "
+          "0 for never. Default 30")
       ->type_name("SECONDS");
 }
 
@@ -277,14 +288,28 @@ void checkNames(const Options& options, const std::string& what) {
   }
 }
 
+// "list" and the phones to list, or "probe".
+std::vector<std::string> namesOfPhoneCommand(const CLI::App& command, const RawOptions& raw) {
+  if (raw.what == "probe" && !raw.names.empty())
+    throw CommandError(ExitCode::kUsage, "'quazor phone probe' takes no name, but got '" + raw.names.front() + "'");
+  if (raw.what == "probe" && command.get_option("--format")->count() > 0) {
+    throw CommandError(ExitCode::kUsage, "--format applies only to 'quazor phone list'; a binding is JSON");
+  }
+  std::vector<std::string> names = raw.names;
+  names.insert(names.begin(), raw.what);
+  return names;
+}
+
 Options optionsOf(const CLI::App& command, const RawOptions& raw) {
-  for (const char* option : {"--plugin", "--output", "--profile", "--parameters", "--phone", "--record", "--of",
-                             "RECORD", "--memory", "--log-limit", "--grace", "--settle", "--except", "--skip"}) {
+  for (const char* option :
+       {"--plugin", "--output", "--profile", "--parameters", "--phone", "--record", "--of", "RECORD", "--memory",
+        "--log-limit", "--grace", "--heartbeat", "--settle", "--except", "--skip"}) {
     refuseEmpty(command, option);
   }
   Options options;
   options.command = commandOf(command.get_name());
   options.names = raw.names;
+  if (options.command == Command::kPhone) options.names = namesOfPhoneCommand(command, raw);
   options.all = raw.all;
   options.plugins.assign(raw.plugins.begin(), raw.plugins.end());
   options.parameterFiles.assign(raw.parameterFiles.begin(), raw.parameterFiles.end());
@@ -306,6 +331,7 @@ Options optionsOf(const CLI::App& command, const RawOptions& raw) {
   for (const std::string& text : raw.limits) options.limits.push_back(limitOfCommandLine(text));
   for (const std::string& text : raw.deadlines) options.deadlines.push_back(parseDeadline(text));
   if (!raw.grace.empty()) options.grace = parseGrace(raw.grace);
+  if (command.get_option_no_throw("--heartbeat") != nullptr) options.heartbeat = parseHeartbeat(raw.heartbeat);
   options.logLevel = logLevelOf(raw.logLevel);
   options.logLimit = logLimitOf(raw.logLimit);
   options.systemLog = raw.systemLog;
@@ -377,6 +403,7 @@ void declareRunningCommands(CLI::App& app, RawOptions& raw) {
     addReportOptions(*command, raw, formats);
     addParameterOptions(*command, raw);
     addProcessOptions(*command, raw);
+    addHeartbeat(*command, raw);
     addTags(*command, raw);
   }
   for (CLI::App* const command : {&run, &analyze}) {
@@ -410,9 +437,13 @@ void declareOtherCommands(CLI::App& app, RawOptions& raw) {
   addProcessOptions(selftest, raw);
   addGrace(selftest, raw);
   CLI::App& phone =
-      *app.add_subcommand("phone", "Find the devices of this machine and print a starter binding for them");
-  phone.add_option("WHAT", raw.names, "probe")->type_name("")->required()->expected(1)->check(CLI::IsMember({"probe"}));
-  addRepeatable(phone, "--output", raw.outputs, "Write the binding to this file instead of printing it", "FILE");
+      *app.add_subcommand("phone", "List the simulated phones, or find this machine's devices for a binding");
+  phone.add_option("WHAT", raw.what, "list: the simulated phones that --phone accepts; probe: this machine's devices")
+      ->type_name("list|probe")
+      ->required()
+      ->check(CLI::IsMember({"list", "probe"}));
+  phone.add_option("PHONE", raw.names, "list: a phone's name, or a pattern (*, ?, [...]) for several")->type_name("");
+  addReportOptions(phone, raw, {"text", "json"});
   CLI::App& completion = *app.add_subcommand("completion", "Print the completion script for bash or zsh");
   completion.add_option("SHELL", raw.names, "bash or zsh")
       ->type_name("")

@@ -352,6 +352,17 @@ RunEvent readSkipped(const Json& json) {
   return DiagnosticSkipped{{*kind, textAt(json, "reason")}};
 }
 
+Json jsonOf(const Heartbeat& event) {
+  return {{"event", "heartbeat"},
+          {"stage", nameOf(event.stage)},
+          {"nanoseconds", event.elapsed.count()},
+          {"date", timestampText(event.date)}};
+}
+
+RunEvent readHeartbeat(const Json& json) {
+  return Heartbeat{stageAt(json, "stage"), nanosecondsAt(json, "nanoseconds"), dateAt(json, "date")};
+}
+
 Json jsonOf(const DiagnosticCompleted& /*event*/) { return {{"event", "diagnosticCompleted"}}; }
 
 RunEvent readDiagnosticCompleted(const Json& /*json*/) { return DiagnosticCompleted{}; }
@@ -393,6 +404,7 @@ constexpr Reader kReaders[] = {{"runBegan", readRunBegan},
                                {"failed", readFailed},
                                {"faultsCounted", readFaultsCounted},
                                {"skipped", readSkipped},
+                               {"heartbeat", readHeartbeat},
                                {"diagnosticCompleted", readDiagnosticCompleted},
                                {"diagnosticEnded", readDiagnosticEnded},
                                {"runEnded", readRunEnded}};

@@ -1,15 +1,24 @@
 #include "host/report/run_report.h"
 
 #include "backends/log/standard_error_log.h"
+#include "contract/message_format.h"
 #include "host/report/text_report.h"
 #include "host/system/output_file.h"
+#include "host/text/display_width.h"
 #include "host/text/table.h"
 #include "host/text/terminal.h"
 
 #include <algorithm>
+#include <chrono>
 #include <utility>
 
 namespace quazor {
+
+namespace {
+
+constexpr std::size_t kMaxNameInHeartbeat = 200;  // so that the line fits where it takesText()
+
+}  // namespace
 
 RunReport::RunReport(ReportOptions options, Console& console)
     : options_(std::move(options)), console_(console), progress_(console.showsProgress ? &console.err : nullptr) {}
@@ -18,6 +27,7 @@ void RunReport::onEvent(const RunEvent& event) {
   if (const auto* const began = std::get_if<RunStarted>(&event)) {
     run_ = *began;
   } else if (const auto* const diagnostic = std::get_if<DiagnosticStarted>(&event)) {
+    running_ = diagnostic->name;
     progress_.start(diagnostic->name, expectedProgressOf(diagnostic->parameters));
   } else if (const auto* const logged = std::get_if<Logged>(&event)) {
     const LogLine& line = logged->line;
@@ -26,6 +36,8 @@ void RunReport::onEvent(const RunEvent& event) {
       console_.err << readableLogLine(line.date, line.level, sharedLog().category(), printableLines(line.text))
                    << std::flush;
     });
+  } else if (const auto* const heartbeat = std::get_if<Heartbeat>(&event)) {
+    tell(*heartbeat);
   } else if (const auto* const ended = std::get_if<RunEnded>(&event)) {
     finishRun(*ended);
   }
@@ -48,6 +60,16 @@ void RunReport::addRecord(DiagnosticRecord record) {
   }
   printUnfiredFaults(console_.err, record);
   records_.push_back(std::move(record));
+}
+
+// The run does not wait for the reader of its heartbeats.
+void RunReport::tell(const Heartbeat& event) {
+  if (console_.showsProgress || (console_.takesText && !console_.takesText())) return;
+  const auto seconds = std::chrono::duration_cast<std::chrono::seconds>(event.elapsed).count();
+  console_.err << formatMessage("quazor: running %@ (%@ of %@), stage %@, for %@ s\n",
+                                shortened(printable(running_), kMaxNameInHeartbeat), records_.size() + 1,
+                                std::max(run_.names.size(), records_.size() + 1), nameOf(event.stage), seconds)
+               << std::flush;
 }
 
 void RunReport::finishRun(const RunEnded& event) {

@@ -8,6 +8,7 @@
 #include "host/report/progress.h"
 #include "host/report/report_format.h"
 
+#include <functional>
 #include <optional>
 #include <ostream>
 #include <string>
@@ -22,6 +23,8 @@ struct Console {
   bool colour = false;         // `out` supports colour
   bool showsProgress = false;  // `err` is a terminal
   bool blocks = false;         // `out` supports UTF-8 and block elements
+  // False if a short text to `err` would have to wait for its reader; empty: never.
+  std::function<bool()> takesText{};
 };
 
 // What the user allows in a run with exit code 0.
@@ -60,6 +63,7 @@ class RunReport final : public RunEventSink {
   Progress& progress() { return progress_; }
 
  private:
+  void tell(const Heartbeat& event);
   void finishRun(const RunEnded& event);
   void writeFile(const OutputRequest& output, const std::optional<std::string>& interrupted);
 
@@ -67,6 +71,7 @@ class RunReport final : public RunEventSink {
   Console& console_;
   Progress progress_;
   RunStarted run_;
+  std::string running_;  // the diagnostic that began last
   std::vector<DiagnosticRecord> records_;
   bool allWritten_ = true;
 };
