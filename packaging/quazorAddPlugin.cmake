@@ -4,6 +4,9 @@ function(quazor_add_plugin name)
   target_link_libraries(${name} PRIVATE quazor::quazor)
   # A plug-in hides its symbols and links everything it uses, so that undefined symbols are linker errors.
   target_link_options(${name} PRIVATE -Wl,--no-undefined)
+  # Errors in memory are harder to exploit: the stack is checked, and tables of the linker are read-only from the start.
+  target_compile_options(${name} PRIVATE -fstack-protector-strong)
+  target_link_options(${name} PRIVATE -Wl,-z,relro -Wl,-z,now)
   # The run path is the installation's from the start: CMake pads one that it will replace with empty entries, and the
   # linker takes those for the working directory.
   set_target_properties(${name} PROPERTIES PREFIX "" CXX_EXTENSIONS OFF CXX_VISIBILITY_PRESET hidden

@@ -424,8 +424,11 @@ void declareOtherCommands(CLI::App& app, RawOptions& raw) {
       ->type_name("");
   addReportOptions(explain, raw, {"text", "json"});
   CLI::App& doctor =
-      *app.add_subcommand("doctor", "Check the installation: plug-ins, profile, phones, bindings, last record");
+      *app.add_subcommand("doctor",
+                          "Check the installation: plug-ins, profile, phones, bindings, last record. With --plugin, "
+                          "judge that plug-in instead: names, summaries, results, explanations, phones, cost");
   addPlugins(doctor, raw);
+  addParameterOptions(doctor, raw);
   addProcessOptions(doctor, raw);
   CLI::App& selftest = *app.add_subcommand(
       "selftest", "Run the diagnostics on the installed simulated phones and report which faults they detect");

@@ -34,6 +34,7 @@ constexpr Example kExamples[] = {
     {"quazor diff before.jsonl after.jsonl", "show what differs between two records"},
     {"quazor explain QZCapturePlugInErrorDomain:206", "what an error means, and what to do next"},
     {"quazor doctor", "check the installation"},
+    {"quazor doctor --plugin build/my_plugin.so", "judge a plug-in as a reviewer would"},
     {"quazor selftest", "check that the diagnostics detect simulated faults"},
     {"quazor new my_plugin", "make the project of a plug-in of your own"},
     {"quazor completion bash > ~/.local/share/bash-completion/completions/quazor"},

@@ -37,8 +37,11 @@ ExitCode verifyCommand(const Options& options, Console& console, WatchedSignals*
 ExitCode diffCommand(const Options& options, Console& console);
 
 // doctor: prints one line per plug-in, backend and file that quazor would use: accepted, or refused with the reason.
-// kAllPassed if nothing is refused, else kCannotRead.
-ExitCode doctorCommand(const Options& options, const Installation& installation, Console& console);
+// kAllPassed if nothing is refused, else kCannotRead. With plug-ins in the options, prints what a reviewer would find
+// in each of these instead: kAllPassed if there is no problem, else kCannotRead. Throws a CommandError (kUsage) for
+// that with --in-process, where `signals` is null, and for parameters without a plug-in.
+ExitCode doctorCommand(const Options& options, const Installation& installation, Console& console,
+                       WatchedSignals* signals);
 
 // selftest: runs the expected outcomes of every installed phone, or of the phones and files named in the options, with
 // the requested number of seeds. kAllPassed if every outcome is as expected, else kFailed. Throws a CommandError if a

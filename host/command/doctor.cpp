@@ -2,6 +2,7 @@
 
 #include "contract/message_format.h"
 #include "host/command/explanations.h"
+#include "host/command/plugin_review.h"
 #include "host/command/selection.h"
 #include "host/device/phone.h"
 #include "host/plugin/profile.h"
@@ -25,8 +26,7 @@ class Doctor {
       : options_(options), installation_(installation), console_(console) {}
 
   ExitCode examine() {
-    std::vector<std::filesystem::path> plugins = options_.plugins;
-    if (plugins.empty()) plugins = installation_.allPlugins();
+    const std::vector<std::filesystem::path> plugins = installation_.allPlugins();
     if (plugins.empty()) {
       tell(false, "plug-in", installation_.shippedPlugin().string(), "no plug-in found in this directory");
     }
@@ -134,9 +134,41 @@ class Doctor {
   bool allFine_ = true;
 };
 
+ExitCode reviewPlugins(const Options& options, const Installation& installation, Console& console,
+                       WatchedSignals* signals) {
+  if (signals == nullptr) {
+    throw CommandError(ExitCode::kUsage,
+                       "doctor --plugin judges a plug-in in processes of its own; leave out "
+                       "--in-process");
+  }
+  std::size_t problems = 0;
+  std::size_t advice = 0;
+  for (const std::filesystem::path& plugin : options.plugins) {
+    const ReviewFindings findings = reviewPlugin(plugin, options, installation, *signals);
+    console.out << "plug-in " << printable(plugin.string()) << '\n';
+    for (const ReviewFinding& one : findings) {
+      std::string rating(nameOf(one.rating));
+      rating.resize(9, ' ');
+      printWrapped(console.out, one.subject + ": " + one.text, "  " + rating, std::string(11, ' '));
+      if (one.rating == Rating::kProblem) ++problems;
+      if (one.rating == Rating::kAdvice) ++advice;
+    }
+  }
+  console.out << countText(options.plugins.size(), "plug-in") << ": " << countText(problems, "problem") << ", "
+              << advice << (advice == 1 ? " piece" : " pieces") << " of advice\n"
+              << std::flush;
+  return problems == 0 ? ExitCode::kAllPassed : ExitCode::kCannotRead;
+}
+
 }  // namespace
 
-ExitCode doctorCommand(const Options& options, const Installation& installation, Console& console) {
+ExitCode doctorCommand(const Options& options, const Installation& installation, Console& console,
+                       WatchedSignals* signals) {
+  if (!options.plugins.empty()) return reviewPlugins(options, installation, console, signals);
+  if (options.withoutProfile || !options.profile.empty() || !options.parameterFiles.empty() ||
+      !options.settings.empty()) {
+    throw CommandError(ExitCode::kUsage, "--set, --parameters and --profile are for the runs of 'doctor --plugin'");
+  }
   return Doctor(options, installation, console).examine();
 }
 

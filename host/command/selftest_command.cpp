@@ -5,10 +5,9 @@
 #include "host/command/selftest.h"
 #include "host/model/judge.h"
 #include "host/model/limit_check.h"
-#include "host/model/record_builder.h"
 #include "host/record/value_json.h"
+#include "host/run/single_run.h"
 #include "host/text/table.h"
-#include "host/text/timestamp.h"
 
 #include <algorithm>
 #include <deque>
@@ -205,28 +204,17 @@ class Selftest {
   DiagnosticRecord run(const std::filesystem::path& file, const ExpectedOutcome& expected, std::uint64_t seed,
                        const Profile& profile) {
     const DescribedDiagnostic& described = find(expected);
-    const Diagnostic& diagnostic = described.diagnostic;
     const ResolvedParameters parameters = parametersOf(described, expected, profile);
     RunOptions runOptions;
     runOptions.makePhone = phonesOfScenario(file, false, seed, installation_.scenarioSource());
     runOptions.logLevel = LogLevel::kError;
-    RecordBuilder builder;
-    builder.onEvent(DiagnosticStarted{diagnostic.name, described.summary(), diagnostic.experimentName,
-                                      diagnostic.analysisName, diagnostic.experimentOnly, parameters, seed, dateNow()});
-    if (signals_ == nullptr) {
-      runDiagnostic(diagnostic, parameters, runOptions, builder);
-    } else {
-      runIsolated(isolation_, *signals_, diagnostic, parameters, runOptions, nullptr, noProgress_, builder);
-    }
-    for (const RunEvent& event : builder.ending(dateNow())) builder.onEvent(event);
-    return builder.takeRecord();
+    return recordOfRun(described, parameters, runOptions, seed, isolation_, signals_);
   }
 
   const Options options_;
   const Installation& installation_;
   const PluginScan scan_;
   const IsolationOptions isolation_;
-  Progress noProgress_{nullptr};  // of single runs
   StatusLine status_;
   Profile profile_;
   std::optional<Profile> strict_;

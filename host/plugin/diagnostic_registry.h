@@ -3,6 +3,8 @@
 
 #include "contract/lab.h"
 
+#include <chrono>
+#include <cstdint>
 #include <filesystem>
 #include <optional>
 #include <string>
@@ -25,12 +27,19 @@ struct Diagnostic {
   std::vector<std::filesystem::path> plugins{};
 };
 
+// The time that something took in a process, and the memory by which the process grew.
+struct Cost {
+  std::chrono::nanoseconds time{};
+  std::uint64_t bytes = 0;
+};
+
 // The descriptions of a diagnostic's experiment and analysis.
 struct DiagnosticDescription {
   QZDescription experiment{""};
   QZDescription analysis{""};
-  DiagnosticErrorPtr error;  // why there is no description; null if there is one
-  bool isAsked = true;       // false if no description was requested; all other members are then empty
+  DiagnosticErrorPtr error;    // why there is no description; null if there is one
+  bool isAsked = true;         // false if no description was requested; all other members are then empty
+  std::optional<Cost> cost{};  // of asking; nothing if it was not measured
 };
 
 // What the names of a command refer to. kDescribable includes the experiments of diagnostics only if they are requested

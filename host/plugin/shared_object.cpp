@@ -16,6 +16,7 @@
 #include <string>
 #include <string_view>
 #include <system_error>
+#include <utility>
 #include <vector>
 
 namespace quazor {
@@ -118,6 +119,67 @@ bool haveNote(std::string_view notes) {
   return false;
 }
 
+constexpr std::uint64_t kMaxDynamic = 65536;  // of the dynamic section, in bytes; a linker writes some hundred
+constexpr std::uint64_t kMaxNames = 256ULL * 1024 * 1024;  // of dynamic symbols, in bytes
+
+// The part of the file that is mapped at an address; nothing if none is.
+std::optional<std::uint64_t> offsetOf(const std::vector<Elf64_Phdr>& segments, std::uint64_t address) {
+  for (const Elf64_Phdr& one : segments) {
+    if (one.p_type != PT_LOAD || address < one.p_vaddr || address - one.p_vaddr >= one.p_filesz) continue;
+    return one.p_offset + (address - one.p_vaddr);
+  }
+  return std::nullopt;
+}
+
+// The text at a place of a string table; empty outside of it.
+std::string textAt(const std::string& names, std::uint64_t at) {
+  return at < names.size() ? std::string(names.c_str() + at) : std::string();
+}
+
+std::vector<std::string> separated(const std::string& text, char separator) {
+  std::vector<std::string> parts(1);
+  for (const char unit : text) {
+    if (unit == separator) {
+      parts.emplace_back();
+    } else {
+      parts.back() += unit;
+    }
+  }
+  return parts;
+}
+
+// The dynamic section, and the strings that it refers to.
+struct DynamicSection {
+  std::vector<Elf64_Dyn> entries;
+  std::string names;
+};
+
+DynamicSection dynamicSectionOf(std::ifstream& file, std::uint64_t size, const std::vector<Elf64_Phdr>& segments) {
+  DynamicSection section;
+  const auto found =
+      std::find_if(segments.begin(), segments.end(), [](const Elf64_Phdr& one) { return one.p_type == PT_DYNAMIC; });
+  if (found == segments.end() || found->p_filesz > kMaxDynamic) return section;
+  for (std::uint64_t at = 0; at + sizeof(Elf64_Dyn) <= found->p_filesz; at += sizeof(Elf64_Dyn)) {
+    Elf64_Dyn entry;
+    if (!isWithin(found->p_offset, at + sizeof entry, size) ||
+        !readAt(file, found->p_offset + at, &entry, sizeof entry) || entry.d_tag == DT_NULL) {
+      break;
+    }
+    section.entries.push_back(entry);
+  }
+  const auto valueOf = [&section](Elf64_Sxword tag) {
+    const auto entry = std::find_if(section.entries.begin(), section.entries.end(),
+                                    [tag](const Elf64_Dyn& one) { return one.d_tag == tag; });
+    return entry == section.entries.end() ? std::uint64_t{0} : entry->d_un.d_val;
+  };
+  const std::optional<std::uint64_t> names = offsetOf(segments, valueOf(DT_STRTAB));
+  const std::uint64_t length = valueOf(DT_STRSZ);
+  if (!names || length > kMaxNames || !isWithin(*names, length, size)) return section;
+  section.names.resize(length);
+  if (!readAt(file, *names, section.names.data(), length)) section.names.clear();
+  return section;
+}
+
 }  // namespace
 
 void validateSharedObject(const std::filesystem::path& path) {
@@ -162,6 +224,36 @@ bool isLoadedOnlyWhenNamed(const std::filesystem::path& path) {
     std::string notes(one.p_filesz, '\0');
     return readAt(file, one.p_offset, notes.data(), notes.size()) && haveNote(notes);
   });
+}
+
+LinkProperties linkPropertiesOf(const std::filesystem::path& path) {
+  std::error_code error;
+  const std::uint64_t size = std::filesystem::file_size(path, error);
+  std::ifstream file(path, std::ios::binary);
+  const std::optional<std::vector<Elf64_Phdr>> segments = segmentsOf(file, size);
+  if (error || !segments) throw InputError("cannot be read");
+  LinkProperties found;
+  for (const Elf64_Phdr& one : *segments) {
+    if (one.p_type == PT_GNU_RELRO) found.protectsRelocations = true;
+    if (one.p_type == PT_GNU_STACK && (one.p_flags & PF_X) != 0) found.hasExecutableStack = true;
+  }
+  const DynamicSection dynamic = dynamicSectionOf(file, size, *segments);
+  for (const Elf64_Dyn& one : dynamic.entries) {
+    const std::uint64_t value = one.d_un.d_val;
+    if (one.d_tag == DT_BIND_NOW || (one.d_tag == DT_FLAGS && (value & DF_BIND_NOW) != 0) ||
+        (one.d_tag == DT_FLAGS_1 && (value & DF_1_NOW) != 0)) {
+      found.bindsNow = true;
+    }
+    if (one.d_tag == DT_TEXTREL || (one.d_tag == DT_FLAGS && (value & DF_TEXTREL) != 0)) {
+      found.hasTextRelocations = true;
+    }
+    if (one.d_tag == DT_RUNPATH || one.d_tag == DT_RPATH) {
+      for (std::string& entry : separated(textAt(dynamic.names, value), ':')) found.runPath.push_back(std::move(entry));
+    }
+  }
+  constexpr std::string_view kStackCheck("\0__stack_chk_fail\0", 18);  // a whole name of the table
+  found.hasStackProtector = dynamic.names.find(kStackCheck) != std::string::npos;
+  return found;
 }
 
 }  // namespace quazor

@@ -134,5 +134,30 @@ TEST(IsLoadedOnlyWhenNamed, IsFalseOfEveryOtherFile) {
   EXPECT_FALSE(isLoadedOnlyWhenNamed(directory.write("text.so", "hello, this is text")));
 }
 
+TEST(LinkPropertiesOf, TellsHowThisProgramWasLinked) {
+  const LinkProperties linked = linkPropertiesOf("/proc/self/exe");
+  EXPECT_TRUE(linked.bindsNow);
+  EXPECT_TRUE(linked.protectsRelocations);
+  EXPECT_TRUE(linked.hasStackProtector);
+  EXPECT_FALSE(linked.hasExecutableStack);
+  EXPECT_FALSE(linked.hasTextRelocations);
+}
+
+TEST(LinkPropertiesOf, TellsAnExecutableStack) {
+  const TestDirectory directory;
+  std::string content = ownProgram();
+  Elf64_Ehdr header;
+  std::memcpy(&header, content.data(), sizeof header);
+  for (std::size_t i = 0; i < header.e_phnum; ++i) {
+    char* const place = content.data() + header.e_phoff + i * sizeof(Elf64_Phdr);
+    Elf64_Phdr segment;
+    std::memcpy(&segment, place, sizeof segment);
+    if (segment.p_type != PT_GNU_STACK) continue;
+    segment.p_flags |= PF_X;
+    std::memcpy(place, &segment, sizeof segment);
+  }
+  EXPECT_TRUE(linkPropertiesOf(directory.write("stack.so", content)).hasExecutableStack);
+}
+
 }  // namespace
 }  // namespace quazor

@@ -14,9 +14,13 @@
 #include "host/system/identity.h"
 #include "host/system/supervision.h"
 
+#include <unistd.h>
+
 #include <algorithm>
 #include <chrono>
 #include <cstddef>
+#include <cstdint>
+#include <fstream>
 #include <memory>
 #include <optional>
 #include <string>
@@ -61,6 +65,36 @@ Supervised converse(const IsolationOptions& options, WatchedSignals& signals, co
   return supervise(child, signals, supervision);
 }
 
+// The memory of this process that is in use, in bytes; 0 if that is unknown.
+std::uint64_t memoryInUse() {
+  std::ifstream status("/proc/self/statm");  // in pages: the address space, and what of it is resident
+  std::uint64_t whole = 0;
+  std::uint64_t resident = 0;
+  status >> whole >> resident;
+  return status ? resident * static_cast<std::uint64_t>(::sysconf(_SC_PAGESIZE)) : 0;
+}
+
+// Measures what happens from its construction on.
+// Thread: the one that made it.
+class CostMeter {
+ public:
+  nlohmann::ordered_json cost() const {
+    const std::uint64_t bytes = memoryInUse();
+    return {{"nanoseconds", std::chrono::nanoseconds(SteadyClock::now() - begin_).count()},
+            {"bytes", bytes > before_ ? bytes - before_ : 0}};
+  }
+
+ private:
+  const std::uint64_t before_ = memoryInUse();
+  const Moment begin_ = SteadyClock::now();
+};
+
+// Throws InputError or Json::exception.
+Cost costFrom(const Json& json) {
+  return {std::chrono::nanoseconds(memberOf(json, "nanoseconds").get<std::int64_t>()),
+          memberOf(json, "bytes").get<std::uint64_t>()};
+}
+
 std::string loadingOf(const std::filesystem::path& file) { return "loading the plug-in '" + file.string() + "'"; }
 
 DiagnosticErrorPtr noProcess(const std::string& purpose, const std::system_error& problem) {
@@ -94,20 +128,23 @@ class PluginLoading {
 
   // After a successful perform().
   const std::vector<QZLab::Registration>& registrations() const { return *registrations_; }
+  const Cost& cost() const { return cost_; }
 
  private:
   void speak(const ConnectionWriter& connection) const {
     const std::size_t before = QZLab::defaultLab().registrations().size();
+    const CostMeter meter;
     try {
       loadPlugin(file_);
     } catch (const InputError& problem) {
       connection.say({{"says", "refused"}, {"text", losslessText(problem.what())}});
       return;
     }
+    Json cost = meter.cost();
     const std::vector<QZLab::Registration>& all = QZLab::defaultLab().registrations();
     Json registrations = Json::array();
     for (std::size_t i = before; i < all.size(); ++i) registrations.push_back(registrationJson(all[i]));
-    connection.say({{"says", "registered"}, {"registrations", std::move(registrations)}});
+    connection.say({{"says", "registered"}, {"registrations", std::move(registrations)}, {"cost", std::move(cost)}});
   }
 
   void listen(const std::string& what, const Json& said) {
@@ -117,6 +154,7 @@ class PluginLoading {
     } else if (what == "registered") {
       std::vector<QZLab::Registration> registrations;
       for (const Json& one : memberOf(said, "registrations")) registrations.push_back(registrationFrom(one));
+      cost_ = costFrom(memberOf(said, "cost"));
       registrations_ = std::move(registrations);
     } else {
       throw InputError("the process says '" + what + "'");
@@ -128,6 +166,7 @@ class PluginLoading {
   const std::filesystem::path file_;
   std::optional<std::string> refusal_;
   std::optional<std::vector<QZLab::Registration>> registrations_;
+  Cost cost_;
 };
 
 // Adds the registrations of a plug-in to the lab, as loading it in this process would.
@@ -217,7 +256,9 @@ class Describing {
     }
     for (const DescribedDiagnostic* const one : diagnostics_) {
       connection.say({{"says", "describing"}});
-      connection.say({{"says", "described"}, {"description", descriptionJson(descriptionOf(one->diagnostic))}});
+      const CostMeter meter;
+      Json description = descriptionJson(descriptionOf(one->diagnostic));
+      connection.say({{"says", "described"}, {"description", std::move(description)}, {"cost", meter.cost()}});
     }
   }
 
@@ -241,6 +282,7 @@ class Describing {
       beginStage(Stage::kDescribe);
     } else if (what == "described" && isDescribing_) {
       diagnostics_[described_]->description = descriptionFrom(memberOf(said, "description"));
+      diagnostics_[described_]->description.cost = costFrom(memberOf(said, "cost"));
       isDescribing_ = false;
       ++described_;
     } else {
@@ -357,13 +399,16 @@ class AcceptedPlugins {
   std::vector<LoadedPlugin> loaded_;
 };
 
-// Loads the plug-in and accepts it. Returns an error if it cannot be loaded; throws a CommandError if it is refused.
+// Loads the plug-in and accepts it, and adds what that took to `costs`. Returns an error if it cannot be loaded; throws
+// a CommandError if it is refused.
 DiagnosticErrorPtr accept(const IsolationOptions& options, const std::filesystem::path& file, WatchedSignals& signals,
-                          AcceptedPlugins& accepted) {
+                          AcceptedPlugins& accepted, std::vector<Cost>& costs) {
   if (options.unasked) checkFile(file);
   PluginLoading loading(options, Deadlines({}, options.deadlines), file);
   DiagnosticErrorPtr error = loading.perform(signals);
-  if (error == nullptr && signals.requestsToEnd() == 0) accepted.accept(file, loading.registrations());
+  if (error != nullptr || signals.requestsToEnd() > 0) return error;
+  accepted.accept(file, loading.registrations());
+  costs.push_back(loading.cost());
   return error;
 }
 
@@ -381,7 +426,7 @@ PluginScan scanPlugins(const IsolationOptions& options, WatchedSignals& signals,
   AcceptedPlugins accepted;
   for (const std::filesystem::path& file : files) {
     try {
-      DiagnosticErrorPtr error = accept(options, file, signals, accepted);
+      DiagnosticErrorPtr error = accept(options, file, signals, accepted, scan.loading);
       if (error != nullptr) scan.failed.push_back({file, std::move(error)});
     } catch (const CommandError& refusal) {
       if (!options.unasked) throw;

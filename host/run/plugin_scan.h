@@ -25,6 +25,7 @@ IsolationOptions withoutFailed(IsolationOptions options, const std::vector<Faile
 struct PluginScan {
   std::vector<DescribedDiagnostic> catalogue;
   std::vector<FailedPlugin> failed;
+  std::vector<Cost> loading;  // of each plug-in that was loaded, in their order; empty if that was not measured
   bool interrupted = false;
 };
 

@@ -121,6 +121,7 @@ extern "C" int LLVMFuzzerTestOneInput(const std::uint8_t* data, std::size_t size
   const bool isAccepted = accepted([] { return validateSharedObject(file.path()), true; }).has_value();
   require(isAccepted == isSharedObject(data, size),
           "a file is accepted exactly if it is of this architecture and has all of its segments");
+  if (isAccepted) accepted([] { return linkPropertiesOf(file.path()).runPath.size(); });
   return 0;
 }
 

@@ -1,7 +1,5 @@
 // The plug-in's camera experiments with the V4L2 capture service and a fake video driver.
-#include "backends/linux/capture/linux_capture_for_tests.h"
-#include "backends/threads/thread_concurrency.h"
-#include "diagnostics/camera_sync/camera_sync_experiment.h"
+#include "tests/sweeps/linux_cameras.h"
 #include "diagnostics/projector_fault/tessel_fault_experiment.h"
 #include "tests/support/fake_camera.h"
 
@@ -14,48 +12,6 @@ namespace {
 
 using Fake = FakeCameras;
 using namespace std::chrono_literals;
-
-// Sleeping advances the time of the fake cameras; `during` is called in the middle.
-class FakeClock final : public Clock {
- public:
-  explicit FakeClock(std::shared_ptr<FakeV4l2Api> kernel) : kernel_(std::move(kernel)) {}
-
-  std::chrono::nanoseconds now() const override { return kernel_->now(); }
-  Date date() const override { return Date(kernel_->now()); }
-  void sleep(std::chrono::nanoseconds duration) override {
-    kernel_->passTime(duration / 2);
-    if (during) during();
-    kernel_->passTime(duration - duration / 2);
-  }
-
-  std::function<void()> during;
-
- private:
-  const std::shared_ptr<FakeV4l2Api> kernel_;
-};
-
-struct Outcome {
-  std::string error;  // empty if there is none
-  std::unique_ptr<QZExperimentResult> result;
-
-  double measured(std::string_view name) const {
-    const Measurement* const one = result == nullptr ? nullptr : result->measurements().find(name);
-    return one == nullptr ? -1000 : one->value();
-  }
-  std::int64_t counter(std::string_view camera, std::string_view name) const {
-    const Value* const all = result->auxiliaryData().find(capture_key::ErrorCounters);
-    return toSigned(entryOf(entryOf(all, camera), name));
-  }
-};
-
-Outcome outcomeOf(QZExperiment& experiment, const Dictionary& parameters) {
-  EXPECT_TRUE(experiment.setupWithParameters(parameters, nullptr, nullptr));
-  DiagnosticErrorPtr error;
-  Outcome outcome;
-  outcome.result = experiment.run(&error);
-  if (outcome.result == nullptr && error != nullptr) outcome.error = defaultText(error);
-  return outcome;
-}
 
 class CameraSyncOnLinuxTest : public testing::Test {
  protected:

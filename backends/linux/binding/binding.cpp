@@ -7,9 +7,11 @@
 
 #include <algorithm>
 #include <array>
+#include <charconv>
 #include <initializer_list>
 #include <limits>
 #include <string_view>
+#include <system_error>
 #include <utility>
 
 namespace quazor {
@@ -152,19 +154,71 @@ ErrorCounterBinding readErrorCounter(const std::string& name, const JsonCursor& 
   return counter;
 }
 
+void readSize(const JsonCursor& size, std::uint32_t* width, std::uint32_t* height) {
+  size.allowKeys({"width", "height"});
+  *width = static_cast<std::uint32_t>(size.at("width").integer(1, kMaxSide));
+  *height = static_cast<std::uint32_t>(size.at("height").integer(1, kMaxSide));
+}
+
+std::uint32_t readFormatIndex(const std::string& key, const JsonCursor& cursor) {
+  std::uint32_t index = 0;
+  const char* const end = key.data() + key.size();
+  const auto [parsed, problem] = std::from_chars(key.data(), end, index);
+  if (problem == std::errc() && parsed == end && std::to_string(index) == key) return index;
+  cursor.fail(inQuotes(key) + " is not a format index; expected a whole number, such as \"16\".");
+}
+
+// Drivers pad shorter codes with spaces.
+std::string readFourcc(const JsonCursor& cursor) {
+  constexpr std::string_view kBigEndian = "-BE";
+  constexpr std::size_t kLength = 4;
+  std::string code = cursor.text();
+  const bool isBigEndian = code.size() > kLength && code.ends_with(kBigEndian);
+  if (isBigEndian) code.resize(code.size() - kBigEndian.size());
+  const bool isPrintable = std::ranges::all_of(code, [](char one) { return one >= ' ' && one <= '~'; });
+  if (code.size() > kLength || !isPrintable) {
+    cursor.fail("must be the code of a format, such as \"YUYV\"; 'quazor phone probe' shows the camera's codes.");
+  }
+  code.resize(kLength, ' ');
+  return isBigEndian ? code + std::string(kBigEndian) : code;
+}
+
+FrameInterval readInterval(const JsonCursor& cursor) {
+  cursor.allowKeys({"numerator", "denominator"});
+  constexpr std::uint64_t kMax = std::numeric_limits<std::uint32_t>::max();
+  return {static_cast<std::uint32_t>(cursor.at("numerator").integer(1, kMax)),
+          static_cast<std::uint32_t>(cursor.at("denominator").integer(1, kMax))};
+}
+
+std::vector<FormatBinding> readFormats(const JsonCursor& cursor, const CameraBinding& camera) {
+  std::vector<FormatBinding> formats;
+  for (const auto& [key, value] : cursor.entries()) {
+    value.allowKeys({"format", "size", "interval"});
+    FormatBinding format;
+    format.index = readFormatIndex(key, value);
+    format.fourcc = readFourcc(value.at("format"));
+    format.width = camera.width;
+    format.height = camera.height;
+    if (const auto size = value.find("size")) readSize(*size, &format.width, &format.height);
+    if (const auto interval = value.find("interval")) format.interval = readInterval(*interval);
+    formats.push_back(std::move(format));
+  }
+  if (formats.empty()) cursor.fail("map at least one format index, or remove the key.");
+  return formats;
+}
+
 CameraBinding readCamera(const std::string& port, const JsonCursor& cursor) {
   if (std::ranges::find(kPorts, port) == kPorts.end()) {
     cursor.fail(inQuotes(port) + " is not a port" + suggestion(port, kPorts));
   }
-  cursor.allowKeys({"description", "node", "size", "buffers", "controls", "metadata", "projector", "errorCounters"});
+  cursor.allowKeys(
+      {"description", "node", "size", "formats", "buffers", "controls", "metadata", "projector", "errorCounters"});
   checkRemark(cursor, "description");
   CameraBinding camera;
   camera.port = port;
   camera.node = readMatch(cursor.at("node"));
-  const JsonCursor size = cursor.at("size");
-  size.allowKeys({"width", "height"});
-  camera.width = static_cast<std::uint32_t>(size.at("width").integer(1, kMaxSide));
-  camera.height = static_cast<std::uint32_t>(size.at("height").integer(1, kMaxSide));
+  readSize(cursor.at("size"), &camera.width, &camera.height);
+  if (const auto formats = cursor.find("formats")) camera.formats = readFormats(*formats, camera);
   if (const auto buffers = cursor.find("buffers")) {
     camera.buffers = static_cast<std::uint32_t>(buffers->integer(kMinBuffers, kMaxBuffers));
   }

@@ -13,6 +13,15 @@
 
 namespace quazor {
 
+// Seconds per frame.
+struct FrameInterval {
+  std::uint32_t numerator = 0;
+  std::uint32_t denominator = 1;
+
+  double framesPerSecond() const { return static_cast<double>(denominator) / static_cast<double>(numerator); }
+  friend bool operator==(const FrameInterval&, const FrameInterval&) = default;
+};
+
 // Selects a video node by what its driver reports (VIDIOC_QUERYCAP), because its number may change from boot to boot. A
 // member without a value matches everything.
 struct VideoNodeMatch {
@@ -71,11 +80,24 @@ struct ErrorCounterBinding {
   std::optional<std::string> control;
 };
 
+// The format, size and interval that a FormatIndex selects. The driver's own index is used where there is no such
+// entry.
+struct FormatBinding {
+  std::uint32_t index = 0;
+  std::string fourcc;  // four characters, for example "YUYV" or "Y16 ", and "-BE" for a big-endian format
+  std::uint32_t width = 0;
+  std::uint32_t height = 0;
+  std::optional<FrameInterval> interval;
+
+  friend bool operator==(const FormatBinding&, const FormatBinding&) = default;
+};
+
 struct CameraBinding {
   std::string port;  // platform/capture_keys.h, port_type
   VideoNodeMatch node;
   std::uint32_t width = 0;
   std::uint32_t height = 0;
+  std::vector<FormatBinding> formats;
   std::uint32_t buffers = 4;
   std::vector<ControlSetting> controls;  // set in this order when a user takes control of the stream
   MetadataBinding metadata;

@@ -1,14 +1,9 @@
-#include "backends/linux/binding/binding.h"
-
-#include "base/text/input_error.h"
-#include "tests/support/thrown_text.h"
+#include "backends/linux/binding/binding_for_tests.h"
 
 #include <gmock/gmock.h>
 #include <gtest/gtest.h>
 
-#include <chrono>
 #include <filesystem>
-#include <fstream>
 #include <string>
 #include <string_view>
 
@@ -23,35 +18,6 @@ namespace fs = std::filesystem;
 using ::testing::ElementsAre;
 using ::testing::Field;
 
-class BindingTest : public ::testing::Test {
- protected:
-  BindingTest()
-      : file_(fs::path(::testing::TempDir()) /
-              ("quazor-binding-" + std::to_string(std::chrono::steady_clock::now().time_since_epoch().count()))) {}
-  ~BindingTest() override { fs::remove(file_); }
-
-  Binding read(std::string_view text) {
-    std::ofstream(file_, std::ios::binary) << text;
-    return readBinding(file_);
-  }
-  // The error message, with "F" for the file; "nothing" if the text is valid.
-  std::string problemOf(std::string_view text) {
-    std::string problem = thrownText<InputError>([&] { read(text); });
-    const std::size_t at = problem.find(file_.string());
-    return at == std::string::npos ? problem : problem.replace(at, file_.string().size(), "F");
-  }
-
-  const fs::path file_;
-};
-
-// A binding with an additional entry on its second line.
-std::string with(const std::string& entry) { return "{\"title\": \"t\",\n" + entry + "}"; }
-// A binding with a camera that has an additional entry on its third line.
-std::string withCamera(const std::string& entry) {
-  return with(R"("cameras": {"BackFacingCamera": {"node": {"card": "c"}, "size": {"width": 4, "height": 2},)"
-              "\n" +
-              entry + "}}");
-}
 std::string withMetadata(const std::string& entries) { return withCamera("\"metadata\": {" + entries + "}"); }
 std::string withField(const std::string& entries) {
   return withMetadata(R"("node": {"card": "m"}, "fields": {"K": {)" + entries + "}}");
@@ -74,6 +40,9 @@ TEST_F(BindingTest, ReadsAllThereIsToSay) {
         "description": "d",
         "node": {"driver": "dr", "card": "ca", "busInfo": "bu"},
         "size": {"width": 640, "height": 360},
+        "formats": {"16": {"format": "MJPG", "size": {"width": 1280, "height": 720},
+                           "interval": {"numerator": 1001, "denominator": 30000}},
+                    "0": {"format": "Y16"}, "4294967295": {"format": "Y16 -BE"}},
         "buffers": 32,
         "controls": {"B": -5, "A": true},
         "metadata": {
@@ -105,6 +74,9 @@ TEST_F(BindingTest, ReadsAllThereIsToSay) {
   EXPECT_EQ(camera.node, (VideoNodeMatch{"dr", "ca", "bu"}));
   EXPECT_EQ(camera.width, 640U);
   EXPECT_EQ(camera.height, 360U);
+  EXPECT_THAT(camera.formats, ElementsAre(FormatBinding{16, "MJPG", 1280, 720, FrameInterval{1001, 30000}},
+                                          FormatBinding{0, "Y16 ", 640, 360, std::nullopt},
+                                          FormatBinding{4294967295, "Y16 -BE", 640, 360, std::nullopt}));
   EXPECT_EQ(camera.buffers, 32U);
   ASSERT_EQ(camera.controls.size(), 2U);
   EXPECT_EQ(camera.controls[0].control, "B");
@@ -176,12 +148,6 @@ TEST_F(BindingTest, ATitleIsEnough) {
   EXPECT_THAT(binding.cameras, testing::IsEmpty());
   EXPECT_FALSE(binding.display);
 }
-
-struct Refused {
-  const char* what;
-  std::string text;
-  std::string problem;
-};
 
 TEST_F(BindingTest, RefusesWhatCamerasCannotBe) {
   const std::string camera = "F:3: cameras.BackFacingCamera";

@@ -3,6 +3,7 @@
 #include "backends/linux/system/linux_error.h"
 #include "platform/capture_keys.h"
 
+#include <algorithm>
 #include <cmath>
 #include <string>
 #include <string_view>
@@ -72,9 +73,19 @@ void LinuxCamera::close() {
   metadataNode_.reset();
 }
 
+// The entry of the binding for the format index; null if the index is the driver's own.
+const FormatBinding* LinuxCamera::formatOf(const CameraSettings& settings) const {
+  const auto index = static_cast<std::uint32_t>(toUnsigned(&settings.formatIndex));
+  const auto found = std::ranges::find(binding_.formats, index, &FormatBinding::index);
+  return found == binding_.formats.end() ? nullptr : &*found;
+}
+
 bool LinuxCamera::applyFormat(const CameraSettings& wanted, DiagnosticErrorPtr* error) {
-  const auto index = static_cast<std::uint32_t>(toUnsigned(&wanted.formatIndex));
-  return node_->setFormat(index, binding_.width, binding_.height, error);
+  VideoMode mode{static_cast<std::uint32_t>(toUnsigned(&wanted.formatIndex)), {}, binding_.width, binding_.height};
+  if (const FormatBinding* const bound = formatOf(wanted)) {
+    mode = {bound->index, bound->fourcc, bound->width, bound->height};
+  }
+  return node_->setFormat(mode, error);
 }
 
 bool LinuxCamera::applyRates(const CameraSettings& wanted, DiagnosticErrorPtr* error) {
@@ -88,23 +99,34 @@ bool LinuxCamera::applyRates(const CameraSettings& wanted, DiagnosticErrorPtr* e
   return !agree || intervalOf(wanted, error);
 }
 
-// Sets the requested rates. Without a rate the driver's own interval remains, which may be unknown.
+// Sets the requested rates. Without a rate the interval of the binding is set, or the driver's own interval remains,
+// which may be unknown.
 std::optional<FrameInterval> LinuxCamera::intervalOf(const CameraSettings& settings, DiagnosticErrorPtr* error) {
   const auto& [minimum, maximum] = std::tie(settings.minimumRate, settings.maximumRate);
-  if (!minimum && !maximum) return node_->interval(nullptr).value_or(FrameInterval());
+  const FormatBinding* const format = formatOf(settings);
+  const std::optional<FrameInterval> bound = format == nullptr ? std::nullopt : format->interval;
+  if (!minimum && !maximum && !bound) return node_->interval(nullptr).value_or(FrameInterval());
   const double lowest = toDouble(pointerTo(minimum));
   const double highest = maximum ? toDouble(&*maximum) : HUGE_VAL;
-  const FrameInterval wanted = intervalFor(maximum ? highest : lowest);
+  const auto fits = [&](FrameInterval interval) {
+    const double rate = interval.numerator == 0 ? 0 : interval.framesPerSecond();
+    return rate > 0 && rate >= lowest * (1 - kRateTolerance) && rate <= highest * (1 + kRateTolerance);
+  };
+  const FrameInterval wanted = bound.value_or(intervalFor(maximum ? highest : lowest));
+  if (bound && !fits(wanted)) {
+    refuseLinux(error, LinuxErrorCode::kNotSupported,
+                "%@: the binding gives format index %@ an interval of %@, which is %@ frames per second, and this rate "
+                "was not requested. Change the interval or remove it.",
+                port(), format->index, textOf(wanted), wanted.framesPerSecond());
+    return std::nullopt;
+  }
   const std::optional<FrameInterval> given = node_->setInterval(wanted, error);
-  if (!given) return std::nullopt;
-  const double rate = given->numerator == 0 ? 0 : given->framesPerSecond();
-  const bool fits = rate > 0 && rate >= lowest * (1 - kRateTolerance) && rate <= highest * (1 + kRateTolerance);
-  if (fits) return given;
+  if (!given || fits(*given)) return given;
   refuseLinux(
       error, LinuxErrorCode::kNotSupported,
       "%@: %@ does not support %@ between frames in this format; its driver uses %@ instead, which is %@ frames "
       "per second.",
-      port(), node_->path(), textOf(wanted), textOf(*given), rate);
+      port(), node_->path(), textOf(wanted), textOf(*given), given->numerator == 0 ? 0 : given->framesPerSecond());
   return std::nullopt;
 }
 

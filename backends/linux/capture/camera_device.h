@@ -62,6 +62,7 @@ class LinuxCamera final : public CameraBack {
   const std::string& port() const { return binding_.port; }
   bool prepare(DiagnosticErrorPtr* error);
   bool exposesAutomatically() const;
+  const FormatBinding* formatOf(const CameraSettings& settings) const;
   std::optional<FrameInterval> intervalOf(const CameraSettings& wanted, DiagnosticErrorPtr* error);
   std::vector<ControlSetting> lightOf(const Value& configuration) const;
 

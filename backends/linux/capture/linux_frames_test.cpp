@@ -274,7 +274,7 @@ TEST(LinuxFramesOwnMachineTest, WhateverFailsAtTheStartLeavesNothingBusy) {
     EXPECT_EQ(fake.kernel->guards(), 0) << row.name;
     EXPECT_EQ(fake.control(kStrobe), 0) << row.name;
     const auto other = V4l2Device::open(fake.kernel, fake.nodes[kInfrared], nullptr);
-    EXPECT_TRUE(other->setFormat(1, 640, 360, nullptr)) << row.name << ": the next user gets EBUSY";
+    EXPECT_TRUE(other->setFormat({1, {}, 640, 360}, nullptr)) << row.name << ": the next user gets EBUSY";
     EXPECT_EQ(fake.start(kInfrared), "done") << row.name;
     EXPECT_EQ(fake.stop(kInfrared), "done") << row.name;
     fake.release();

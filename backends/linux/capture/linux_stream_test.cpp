@@ -64,10 +64,54 @@ TEST(LinuxStreamOwnMachineTest, AFormatThatIsNotThereOrHasAnotherSizeIsRefused) 
   binding.cameras[1].width = 800;
   Fake fake(binding);
   ASSERT_EQ(fake.take(CaptureStreams{fake.streams[0], fake.streams[1]}), "done");
-  EXPECT_EQ(fake.set(fake.wide(), capture_key::FormatIndex, 2), "5 " + fake.nodes[0] + " has no format with index 2.");
+  EXPECT_EQ(fake.set(fake.wide(), capture_key::FormatIndex, 2),
+            "5 " + fake.nodes[0] +
+                " has no format with index 2; the binding can map the index to one of its formats: YUYV, GREY.");
   EXPECT_EQ(
       fake.set(fake.stream(1), capture_key::FormatIndex, 1),
       "5 " + fake.nodes[1] + ": format 1 (GREY) of 800 x 360 is not available; the driver offers GREY of 640 x 360.");
+}
+
+TEST(LinuxStreamOwnMachineTest, TheBindingMapsAFormatIndexToFormatSizeAndInterval) {
+  Binding binding = fakeBinding();
+  binding.cameras[0].formats = {{16, "GREY", 640, 480, FrameInterval{1, 25}},
+                                {14, "NV12", 640, 360, std::nullopt},
+                                {9, "YUYV", 800, 600, std::nullopt}};
+  Fake fake(binding);
+  ASSERT_EQ(fake.take(0), "done");
+  ASSERT_EQ(fake.set(fake.wide(), capture_key::FormatIndex, 16), "done");
+  const auto format = [&] { return fake.kernel->with(fake.nodes[0], [](FakeNode& node) { return node.format; }); };
+  EXPECT_EQ(format().pixelformat, fakeCode('G', 'R', 'E', 'Y'));
+  EXPECT_EQ(format().height, 480U);
+  EXPECT_EQ(get(fake, capture_key::FormatIndex), Value(16));
+
+  ASSERT_EQ(fake.set(fake.wide(), capture_key::MinimumFrameRate, 30), "done");
+  EXPECT_EQ(
+      fake.set(fake.wide(), capture_key::MaximumFrameRate, 30),
+      "5 BackFacingCamera: the binding gives format index 16 an interval of 1/25 s, which is 25 frames per second, "
+      "and this rate was not requested. Change the interval or remove it.");
+  EXPECT_EQ(fake.set(fake.wide(), capture_key::MinimumFrameRate, 20), "done");
+  EXPECT_EQ(fake.set(fake.wide(), capture_key::MaximumFrameRate, 30), "done");
+  EXPECT_EQ(fake.kernel->with(fake.nodes[0], [](FakeNode& node) { return node.interval; }), (FrameInterval{1, 25}));
+
+  EXPECT_EQ(fake.set(fake.wide(), capture_key::FormatIndex, 14),
+            "5 " + fake.nodes[0] +
+                " has no format \"NV12\", to which the binding maps format index 14; its formats are YUYV, GREY.");
+  EXPECT_EQ(
+      fake.set(fake.wide(), capture_key::FormatIndex, 9),
+      "5 " + fake.nodes[0] + ": format 9 (YUYV) of 800 x 600 is not available; the driver offers YUYV of 640 x 360.");
+  EXPECT_EQ(format().height, 480U) << "a refused format changes nothing";
+  EXPECT_EQ(fake.set(fake.wide(), capture_key::FormatIndex, 1), "done") << "other indexes are the driver's own";
+  EXPECT_EQ(format().height, 360U);
+}
+
+TEST(LinuxStreamOwnMachineTest, TheBindingsIntervalAppliesWithoutARate) {
+  Binding binding = fakeBinding();
+  binding.cameras[0].formats = {{0, "YUYV", 640, 360, FrameInterval{1, 25}}};
+  Fake fake(binding);
+  ASSERT_EQ(fake.take(0), "done");
+  EXPECT_EQ(fake.start(0), "done");
+  EXPECT_EQ(fake.kernel->with(fake.nodes[0], [](FakeNode& node) { return node.interval; }), (FrameInterval{1, 25}));
 }
 
 TEST(LinuxStreamOwnMachineTest, ARateThatTheDriverSilentlyChangesIsRefusedWithTheDriversOwn) {

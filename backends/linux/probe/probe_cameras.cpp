@@ -8,6 +8,8 @@
 #include <array>
 #include <cmath>
 #include <optional>
+#include <set>
+#include <string_view>
 #include <utility>
 
 namespace quazor {
@@ -15,9 +17,15 @@ namespace {
 
 using Json = nlohmann::ordered_json;
 
-constexpr std::array kPorts{port_type::BackFacingCamera, port_type::BackFacingTelephotoCamera,
-                            port_type::BackFacingSuperWideCamera, port_type::FrontFacingCamera,
-                            port_type::FrontFacingInfraredCamera};
+// The ports in the order in which cameras are assigned to them, with the format index that the camera diagnostics set.
+struct PortToBind {
+  std::string_view port;
+  std::uint32_t formatIndex = 0;
+};
+constexpr std::array kPorts{
+    PortToBind{port_type::BackFacingCamera, 16}, PortToBind{port_type::BackFacingTelephotoCamera, 14},
+    PortToBind{port_type::BackFacingSuperWideCamera, 9}, PortToBind{port_type::FrontFacingCamera, 1},
+    PortToBind{port_type::FrontFacingInfraredCamera, 0}};
 constexpr double kDefaultRate = 30;
 // The size for a camera that supports any size, and the maximum for others.
 constexpr std::uint32_t kDefaultWidth = 640;
@@ -25,15 +33,13 @@ constexpr std::uint32_t kDefaultHeight = 480;
 constexpr std::uint64_t kMaxPixels = std::uint64_t{1920} * 1080;
 constexpr std::uint32_t kMaxSide = 65536;  // the maximum of a binding
 
-bool reachesUsualRate(const FrameSize& size) {
-  bool below = false;
-  bool above = false;
-  for (const FrameInterval& interval : size.intervals) {
-    const double rate = interval.framesPerSecond();
-    if (std::abs(rate - kDefaultRate) < 0.01) return true;
-    (rate < kDefaultRate ? below : above) = true;
-  }
-  return size.anyIntervalBetween && below && above;
+bool isDefaultRate(const FrameInterval& interval) { return std::abs(interval.framesPerSecond() - kDefaultRate) < 0.01; }
+
+bool reachesDefaultRate(const FrameSize& size) {
+  const auto isBelow = [](const FrameInterval& interval) { return interval.framesPerSecond() < kDefaultRate; };
+  if (std::ranges::any_of(size.intervals, isDefaultRate)) return true;
+  return size.anyIntervalBetween && std::ranges::any_of(size.intervals, isBelow) &&
+         !std::ranges::all_of(size.intervals, isBelow);
 }
 
 std::string rateText(const FrameInterval& interval) {
@@ -85,22 +91,83 @@ void tellControls(const std::vector<VideoControl>& controls, std::vector<std::st
   if (!names.empty()) lines->push_back("    controls: " + names);
 }
 
-// The size for the starter binding: the largest one at the default rate, or the largest one.
-std::optional<std::pair<std::uint32_t, std::uint32_t>> chosenSize(const VideoNodeDetails& details) {
-  std::optional<std::pair<std::uint32_t, std::uint32_t>> chosen;
+// How a camera is used for a format index.
+struct ChosenMode {
+  const VideoFormat* format = nullptr;
+  std::uint32_t width = 0;
+  std::uint32_t height = 0;
+  std::optional<FrameInterval> interval;  // the driver's interval for the default rate, if it reports one
+  bool hasDefaultRate = false;
+};
+
+ChosenMode modeOf(const VideoFormat& format, const FrameSize& size) {
+  ChosenMode mode{&format,
+                  std::clamp(kDefaultWidth, size.width, std::max(size.width, size.maximumWidth)),
+                  std::clamp(kDefaultHeight, size.height, std::max(size.height, size.maximumHeight)),
+                  {},
+                  reachesDefaultRate(size)};
+  const auto usual = std::ranges::find_if(size.intervals, isDefaultRate);
+  if (usual != size.intervals.end() && usual->numerator > 0) mode.interval = *usual;
+  return mode;
+}
+
+// The largest size at the default rate, or the largest one; nothing if the format has no usable size.
+std::optional<ChosenMode> bestModeOf(const VideoFormat& format) {
+  std::optional<ChosenMode> chosen;
   std::pair<bool, std::uint64_t> best;
-  if (details.formats.empty()) return chosen;
-  for (const FrameSize& size : details.formats.front().sizes) {
-    const std::uint32_t width = std::clamp(kDefaultWidth, size.width, std::max(size.width, size.maximumWidth));
-    const std::uint32_t height = std::clamp(kDefaultHeight, size.height, std::max(size.height, size.maximumHeight));
-    if (std::min(width, height) == 0 || std::max(width, height) > kMaxSide) continue;
-    const std::uint64_t pixels = std::uint64_t{width} * height;
-    const std::pair<bool, std::uint64_t> worth{reachesUsualRate(size), pixels <= kMaxPixels ? pixels : 1};
+  for (const FrameSize& size : format.sizes) {
+    const ChosenMode mode = modeOf(format, size);
+    if (std::min(mode.width, mode.height) == 0 || std::max(mode.width, mode.height) > kMaxSide) continue;
+    const std::uint64_t pixels = std::uint64_t{mode.width} * mode.height;
+    const std::pair<bool, std::uint64_t> worth{mode.hasDefaultRate, pixels <= kMaxPixels ? pixels : 1};
     if (chosen && worth <= best) continue;
     best = worth;
-    chosen = {width, height};
+    chosen = mode;
   }
   return chosen;
+}
+
+// A binding can name the format only if its code is text.
+bool canBeNamed(const VideoFormat& format) {
+  return std::ranges::all_of(format.fourcc, [](char one) { return one >= ' ' && one <= '~'; });
+}
+
+// The mode for a format index of the diagnostics: among the formats at the default rate, or else all formats, the one
+// whose index is nearest. Nothing if no format is usable.
+std::optional<ChosenMode> modeFor(std::uint32_t index, const std::vector<VideoFormat>& formats) {
+  std::optional<ChosenMode> chosen;
+  std::pair<bool, std::uint32_t> best;
+  for (const VideoFormat& format : formats) {
+    const std::optional<ChosenMode> mode = bestModeOf(format);
+    const std::uint32_t distance = std::max(format.index, index) - std::min(format.index, index);
+    if (!mode || (distance > 0 && !canBeNamed(format))) continue;
+    const std::pair<bool, std::uint32_t> cost{!mode->hasDefaultRate, distance};
+    if (chosen && cost >= best) continue;
+    best = cost;
+    chosen = mode;
+  }
+  return chosen;
+}
+
+// True if the driver's own format with that index has the size of `mode` at the default rate, if `mode` has that rate.
+bool isDriversOwn(std::uint32_t index, const ChosenMode& mode, const std::vector<VideoFormat>& formats) {
+  const auto own = std::ranges::find(formats, index, &VideoFormat::index);
+  if (own == formats.end()) return false;
+  return own->index == mode.format->index || std::ranges::any_of(own->sizes, [&](const FrameSize& size) {
+           const ChosenMode other = modeOf(*own, size);
+           return other.width == mode.width && other.height == mode.height &&
+                  (other.hasDefaultRate || !mode.hasDefaultRate);
+         });
+}
+
+Json sizeEntry(const ChosenMode& mode) { return {{"width", mode.width}, {"height", mode.height}}; }
+
+Json formatEntry(const ChosenMode& mode) {
+  Json entry = {{"format", mode.format->fourcc}, {"size", sizeEntry(mode)}};
+  if (mode.interval) {
+    entry["interval"] = {{"numerator", mode.interval->numerator}, {"denominator", mode.interval->denominator}};
+  }
+  return entry;
 }
 
 bool isSameMatch(const V4l2DeviceInfo& a, const V4l2DeviceInfo& b) {
@@ -148,33 +215,43 @@ class CameraProbe {
     const auto isLikeIt = [&node](const V4l2DeviceInfo& other) {
       return other.kind == VideoNodeKind::kCamera && other.problem == nullptr && isSameMatch(other, node);
     };
-    const auto size = chosenSize(*details);
-    if (!size) {
-      tell("    unsuitable: its driver reports no format, or no usable size for the first one");
+    const std::vector<VideoFormat>& formats = details->formats;
+    const bool isTaken = cameras_.size() == kPorts.size();
+    const auto mode = modeFor(isTaken ? 0 : kPorts.at(cameras_.size()).formatIndex, formats);
+    if (!mode) {
+      tell("    unsuitable: its driver reports no format, or no usable size");
     } else if (node.driver.empty() && node.card.empty() && node.busInfo.empty()) {
       tell("    unsuitable: its driver reports nothing that a binding could use to identify it");
     } else if (std::ranges::count_if(nodes_, isLikeIt) > 1) {
       tell("    unsuitable: another camera has the same driver, card and bus, so a binding cannot distinguish them");
-    } else if (cameras_.size() == kPorts.size()) {
+    } else if (isTaken) {
       tell("    suitable, but all ports are taken; use it instead of another camera in the binding below");
     } else {
-      bind(node, *size);
+      bind(node, *mode, formats);
     }
-    if (size && std::ranges::none_of(details->formats.front().sizes, reachesUsualRate)) {
-      tell("    Its first format has no size at 30 frames a second, the rate that the camera diagnostics use.");
+    if (mode && !mode->hasDefaultRate) {
+      tell("    Its formats have no size at 30 frames a second, the rate that the camera diagnostics use.");
     }
-    tellFormats(details->formats, lines_);
+    tellFormats(formats, lines_);
     tellControls(details->controls, lines_);
   }
 
-  void bind(const V4l2DeviceInfo& node, std::pair<std::uint32_t, std::uint32_t> size) {
-    const std::string port(kPorts.at(cameras_.size()));
-    tell("    suitable: " + port + " in the binding below; check which camera it really is");
+  void bind(const V4l2DeviceInfo& node, const ChosenMode& mode, const std::vector<VideoFormat>& formats) {
+    const auto [port, formatIndex] = kPorts.at(cameras_.size());
+    tell("    suitable: " + std::string(port) + " in the binding below; check which camera it really is");
     Json match = Json::object();
     if (!node.driver.empty()) match["driver"] = node.driver;
     if (!node.card.empty()) match["card"] = node.card;
     if (!node.busInfo.empty()) match["busInfo"] = node.busInfo;
-    cameras_[port] = {{"node", std::move(match)}, {"size", {{"width", size.first}, {"height", size.second}}}};
+    Json camera = {{"node", std::move(match)}, {"size", sizeEntry(mode)}};
+    // Index 0 is that of a stream whose format was never set.
+    for (const std::uint32_t index : std::set{std::uint32_t{0}, formatIndex}) {
+      if (isDriversOwn(index, mode, formats) || !canBeNamed(*mode.format)) continue;
+      camera["formats"][std::to_string(index)] = formatEntry(mode);
+      tell(formatMessage("    format index %@ of the diagnostics: %@ of %@x%@", index, mode.format->fourcc, mode.width,
+                         mode.height));
+    }
+    cameras_[std::string(port)] = std::move(camera);
   }
 
   void tellMetadata(const V4l2DeviceInfo& node) const {

@@ -142,6 +142,48 @@ TEST_F(ProbeTest, ChoosesTheLargestSizeAtTheUsualRate) {
   }
 }
 
+// A USB camera: every format has sizes and rates of its own.
+FakeNode webcam(const std::string& bus) {
+  FakeNode node = fakeCamera(bus);
+  node.formats = {
+      {fakeCode('M', 'J', 'P', 'G'), "Motion-JPEG", {{1920, 1080, {{333333, 10000000}}}, {640, 480, {{1, 30}}}}},
+      {fakeCode('Y', 'U', 'Y', 'V'), "YUYV 4:2:2", {{1280, 720, {{1, 10}}}, {640, 480, {{1, 30}}}}},
+      {fakeCode('N', 'V', '1', '2'), "Y/UV 4:2:0", {{640, 360, {{1, 30}}}}},
+      {fakeCode('H', '2', '6', '4'), "H.264", {{1280, 720, {{1, 15}}}}}};
+  return node;
+}
+
+TEST_F(ProbeTest, MapsTheFormatIndexesOfTheDiagnosticsThatACameraDoesNotHave) {
+  for (int i = 0; i < 5; ++i) kernel_->add(i, webcam("fake:" + std::to_string(i)));
+  const std::vector<std::string> told = lines();
+  ASSERT_EQ(binding_.cameras.size(), 5U);
+  const CameraBinding& back = binding_.cameras[0];
+  EXPECT_EQ(back.width * 1000 + back.height, 640360U);
+  EXPECT_THAT(back.formats, ElementsAre(FormatBinding{0, "NV12", 640, 360, FrameInterval{1, 30}},
+                                        FormatBinding{16, "NV12", 640, 360, FrameInterval{1, 30}}))
+      << "the last format has no size at 30, and the first one not this size";
+  EXPECT_THAT(told, Contains("    format index 16 of the diagnostics: NV12 of 640x360"));
+  EXPECT_EQ(binding_.cameras[1].formats.at(1).index, 14U);
+  EXPECT_EQ(binding_.cameras[2].formats.at(1).index, 9U);
+
+  const CameraBinding& front = binding_.cameras[3];
+  EXPECT_EQ(front.width * 1000 + front.height, 640480U) << "of format 1, which the front camera uses";
+  EXPECT_THAT(front.formats, ElementsAre());
+  const CameraBinding& infrared = binding_.cameras[4];
+  EXPECT_EQ(infrared.width, 1920U);
+  EXPECT_THAT(infrared.formats, ElementsAre());
+}
+
+TEST_F(ProbeTest, MapsOnlyToFormatsWhoseCodeCanBeWritten) {
+  FakeNode node = fakeCamera("fake:0");
+  const std::vector<FakeSize> sizes = node.formats[0].sizes;
+  node.formats = {{fakeCode('Y', '1', '6', ' ') | 1U << 31, "big-endian", sizes}, {0x01020304, "unprintable", sizes}};
+  kernel_->add(0, node);
+  probe();
+  ASSERT_EQ(binding_.cameras.size(), 1U);
+  EXPECT_THAT(binding_.cameras[0].formats, ElementsAre(FormatBinding{16, "Y16 -BE", 640, 360, FrameInterval{1, 30}}));
+}
+
 TEST_F(ProbeTest, TellsWhyACameraDoesNotFit) {
   FakeNode without = fakeCamera("fake:0");
   without.formats.clear();
@@ -179,7 +221,7 @@ TEST_F(ProbeTest, BindsNoCameraThatABindingCannotName) {
   kernel_->add(1, absurd);
   const std::vector<std::string> told = lines();
   EXPECT_THAT(told, Contains(HasSubstr("reports nothing that a binding could use to identify it")));
-  EXPECT_THAT(told, Contains(HasSubstr("no usable size for the first one")));
+  EXPECT_THAT(told, Contains(HasSubstr("reports no format, or no usable size")));
   EXPECT_TRUE(binding_.cameras.empty());
 }
 

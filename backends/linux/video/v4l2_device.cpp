@@ -14,11 +14,12 @@ namespace {
 // Drivers list some hundreds of controls or formats at most; the limit stops one that never ends its list.
 constexpr std::uint32_t kMaxItems = 4096;
 
-// The four characters of a pixel format.
+// The four characters of a pixel format, and "-BE" for a big-endian one.
 std::string fourccText(std::uint32_t fourcc) {
+  constexpr std::uint32_t kBigEndian = 1U << 31;
   std::string text;
   for (int shift = 0; shift < 32; shift += 8) text += static_cast<char>(fourcc >> shift & 0x7f);
-  return text;
+  return (fourcc & kBigEndian) == 0 ? text : text + "-BE";
 }
 
 FrameInterval intervalOf(const v4l2_fract& fraction) { return {fraction.numerator, fraction.denominator}; }
@@ -141,33 +142,52 @@ void V4l2Device::listIntervals(std::uint32_t fourcc, FrameSize& size) const {
   }
 }
 
-bool V4l2Device::setFormat(std::uint32_t index, std::uint32_t width, std::uint32_t height, DiagnosticErrorPtr* error) {
-  v4l2_fmtdesc description{};
-  description.index = index;
-  description.type = V4L2_BUF_TYPE_VIDEO_CAPTURE;
-  const int result = call(VIDIOC_ENUM_FMT, &description);
-  if (result == EINVAL) {
-    failLinux(error, LinuxErrorCode::kNotSupported, formatMessage("%@ has no format with index %@.", path_, index));
-    return false;
+// The driver's number for the format; nothing and an error if it has no such format.
+std::optional<std::uint32_t> V4l2Device::pixelFormatOf(const VideoMode& mode, DiagnosticErrorPtr* error) const {
+  std::string offered;
+  for (std::uint32_t index = 0; index < kMaxItems; ++index) {
+    v4l2_fmtdesc description{};
+    description.index = index;
+    description.type = V4L2_BUF_TYPE_VIDEO_CAPTURE;
+    const int result = call(VIDIOC_ENUM_FMT, &description);
+    if (result == EINVAL) break;
+    if (result != 0) {
+      failSystemCall(error, "VIDIOC_ENUM_FMT", path_, result);
+      return std::nullopt;
+    }
+    const std::string fourcc = fourccText(description.pixelformat);
+    if (mode.fourcc ? *mode.fourcc == fourcc : mode.index == index) return description.pixelformat;
+    offered += (offered.empty() ? "" : ", ") + fourcc;
   }
-  if (result != 0) {
-    failSystemCall(error, "VIDIOC_ENUM_FMT", path_, result);
-    return false;
+  if (offered.empty()) offered = "none";
+  if (mode.fourcc) {
+    refuseLinux(error, LinuxErrorCode::kNotSupported,
+                "%@ has no format \"%@\", to which the binding maps format index %@; its formats are %@.", path_,
+                *mode.fourcc, mode.index, offered);
+  } else {
+    refuseLinux(error, LinuxErrorCode::kNotSupported,
+                "%@ has no format with index %@; the binding can map the index to one of its formats: %@.", path_,
+                mode.index, offered);
   }
+  return std::nullopt;
+}
+
+bool V4l2Device::setFormat(const VideoMode& mode, DiagnosticErrorPtr* error) {
+  const std::optional<std::uint32_t> fourcc = pixelFormatOf(mode, error);
+  if (!fourcc) return false;
   v4l2_format wanted{};
   wanted.type = V4L2_BUF_TYPE_VIDEO_CAPTURE;
-  wanted.fmt.pix.width = width;
-  wanted.fmt.pix.height = height;
-  wanted.fmt.pix.pixelformat = description.pixelformat;
+  wanted.fmt.pix.width = mode.width;
+  wanted.fmt.pix.height = mode.height;
+  wanted.fmt.pix.pixelformat = *fourcc;
   wanted.fmt.pix.field = V4L2_FIELD_ANY;
   // VIDIOC_S_FMT may return another format than VIDIOC_TRY_FMT if other settings of the device changed in between.
   const auto isGranted = [&](const v4l2_pix_format& given) {
-    if (given.width == width && given.height == height && given.pixelformat == description.pixelformat) return true;
-    failLinux(error, LinuxErrorCode::kNotSupported,
-              formatMessage("%@: format %@ (%@) of %@ x %@ is not available; the driver offers %@ of %@ x %@.", path_,
-                            index, fourccText(description.pixelformat), width, height, fourccText(given.pixelformat),
-                            given.width, given.height));
-    return false;
+    if (given.width == mode.width && given.height == mode.height && given.pixelformat == *fourcc) return true;
+    return refuseLinux(error, LinuxErrorCode::kNotSupported,
+                       "%@: format %@ (%@) of %@ x %@ is not available; the driver offers %@ of %@ x %@.", path_,
+                       mode.index, fourccText(*fourcc), mode.width, mode.height, fourccText(given.pixelformat),
+                       given.width, given.height);
   };
   v4l2_format offered = wanted;
   return call(VIDIOC_TRY_FMT, "VIDIOC_TRY_FMT", &offered, error) && isGranted(offered.fmt.pix) &&

@@ -20,6 +20,14 @@
 
 namespace quazor {
 
+// What to set with V4l2Device::setFormat().
+struct VideoMode {
+  std::uint32_t index = 0;            // the FormatIndex, for messages; the driver's own index if there is no code
+  std::optional<std::string> fourcc;  // the code of a format, as in VideoFormat
+  std::uint32_t width = 0;
+  std::uint32_t height = 0;
+};
+
 // Every failing call stores an error with the call, the device and the system's error.
 //
 // Thread: any; the only state is the list of controls, which open() reads.
@@ -46,9 +54,9 @@ class V4l2Device final {
 
   // The formats in the driver's order, with their known sizes and intervals.
   std::vector<VideoFormat> formats() const;
-  // Sets the format with that index and frame size. Fails (kNotSupported), without changing anything, if the driver
-  // would use another size or the index is invalid.
-  bool setFormat(std::uint32_t index, std::uint32_t width, std::uint32_t height, DiagnosticErrorPtr* error);
+  // Sets the format and frame size. Fails (kNotSupported), without changing anything, if the driver has no such format
+  // or would use another size.
+  bool setFormat(const VideoMode& mode, DiagnosticErrorPtr* error);
   // The current time between frames; nothing and an error if the driver cannot report it.
   std::optional<FrameInterval> interval(DiagnosticErrorPtr* error) const;
   // Requests an interval and returns the one that the driver has set, which may differ.
@@ -73,6 +81,7 @@ class V4l2Device final {
   V4l2Device(std::shared_ptr<V4l2Api> kernel, std::string path, int descriptor);
 
   void listControls();
+  std::optional<std::uint32_t> pixelFormatOf(const VideoMode& mode, DiagnosticErrorPtr* error) const;
   std::vector<FrameSize> sizesOf(std::uint32_t fourcc) const;
   void listIntervals(std::uint32_t fourcc, FrameSize& size) const;
 

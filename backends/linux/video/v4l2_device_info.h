@@ -15,15 +15,6 @@
 
 namespace quazor {
 
-// Seconds per frame.
-struct FrameInterval {
-  std::uint32_t numerator = 0;
-  std::uint32_t denominator = 1;
-
-  double framesPerSecond() const { return static_cast<double>(denominator) / static_cast<double>(numerator); }
-  friend bool operator==(const FrameInterval&, const FrameInterval&) = default;
-};
-
 // A frame size or, if the maximum differs from the minimum, a range of sizes.
 struct FrameSize {
   std::uint32_t width = 0;

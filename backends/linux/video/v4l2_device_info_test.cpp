@@ -218,7 +218,7 @@ TEST(OpenedVideoNodeTest, AFormatThatTheDriverChangesAsItIsSetIsRefused) {
   const auto kernel = std::make_shared<ChangingKernel>();
   const std::string path = kernel->add(0, fakeCamera("fake:0"));
   const auto node = V4l2Device::open(kernel, path, nullptr);
-  EXPECT_EQ(outcome([&](auto* error) { return node->setFormat(1, 640, 360, error); }),
+  EXPECT_EQ(outcome([&](auto* error) { return node->setFormat({1, {}, 640, 360}, error); }),
             "5 " + path + ": format 1 (GREY) of 640 x 360 is not available; the driver offers GREY of 640 x 352.");
 }
 

@@ -1,0 +1,49 @@
+#include "backends/linux/binding/binding_for_tests.h"
+
+#include <gmock/gmock.h>
+#include <gtest/gtest.h>
+
+#include <string>
+
+namespace quazor {
+namespace {
+
+TEST_F(BindingTest, RefusesFormatsThatCannotBe) {
+  const std::string formats = "F:3: cameras.BackFacingCamera.formats";
+  const std::string code =
+      ": must be the code of a format, such as \"YUYV\"; 'quazor phone probe' shows the camera's codes.";
+  const auto withFormat = [](const std::string& entries) {
+    return withCamera("\"formats\": {\"16\": {" + entries + "}}");
+  };
+  const auto withIndex = [](const std::string& index) {
+    return withCamera("\"formats\": {\"" + index + R"(": {"format": "YUYV"}})");
+  };
+  const auto noIndex = [&formats](const std::string& index) {
+    return formats + "." + index + ": \"" + index +
+           "\" is not a format index; expected a whole number, such as \"16\".";
+  };
+  const Refused kRows[] = {
+      {"an empty map", withCamera("\"formats\": {}"), formats + ": map at least one format index, or remove the key."},
+      {"a list", withCamera("\"formats\": []"), formats + ": must be an object, not an array."},
+      {"an index that is a name", withIndex("YUYV"), noIndex("YUYV")},
+      {"a negative index", withIndex("-1"), noIndex("-1")},
+      {"an index in another spelling", withIndex("016"), noIndex("016")},
+      {"an index that is too large", withIndex("4294967296"), noIndex("4294967296")},
+      {"no format", withFormat(""), formats + ".16: the key \"format\" is missing."},
+      {"a format that is an index", withFormat("\"format\": 3"),
+       formats + ".16.format: must be a non-empty string, not 3."},
+      {"a format's description", withFormat("\"format\": \"YUYV 4:2:2\""), formats + ".16.format" + code},
+      {"a format that is no text", withFormat("\"format\": \"Y\\u0001\""), formats + ".16.format" + code},
+      {"half a size", withFormat(R"("format": "YUYV", "size": {"width": 4})"),
+       formats + ".16.size: the key \"height\" is missing."},
+      {"an interval of no time", withFormat(R"("format": "YUYV", "interval": {"numerator": 0, "denominator": 30})"),
+       formats + ".16.interval.numerator: must be an integer from 1 to 4294967295, not 0."},
+      {"an interval that is a rate", withFormat(R"("format": "YUYV", "interval": 30)"),
+       formats + ".16.interval: must be an object, not 30."},
+      {"an unknown key", withFormat(R"("format": "YUYV", "rate": 30)"), formats + ".16: unknown key \"rate\""},
+  };
+  for (const Refused& row : kRows) EXPECT_THAT(problemOf(row.text), ::testing::StartsWith(row.problem)) << row.what;
+}
+
+}  // namespace
+}  // namespace quazor

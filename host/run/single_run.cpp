@@ -1,0 +1,25 @@
+#include "host/run/single_run.h"
+
+#include "host/model/record_builder.h"
+#include "host/text/timestamp.h"
+
+namespace quazor {
+
+DiagnosticRecord recordOfRun(const DescribedDiagnostic& described, const ResolvedParameters& parameters,
+                             const RunOptions& runOptions, std::uint64_t seed, const IsolationOptions& isolation,
+                             WatchedSignals* signals) {
+  const Diagnostic& diagnostic = described.diagnostic;
+  RecordBuilder builder;
+  builder.onEvent(DiagnosticStarted{diagnostic.name, described.summary(), diagnostic.experimentName,
+                                    diagnostic.analysisName, diagnostic.experimentOnly, parameters, seed, dateNow()});
+  if (signals == nullptr) {
+    runDiagnostic(diagnostic, parameters, runOptions, builder);
+  } else {
+    Progress noProgress(nullptr);
+    runIsolated(isolation, *signals, diagnostic, parameters, runOptions, nullptr, noProgress, builder);
+  }
+  for (const RunEvent& event : builder.ending(dateNow())) builder.onEvent(event);
+  return builder.takeRecord();
+}
+
+}  // namespace quazor

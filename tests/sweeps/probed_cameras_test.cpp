@@ -1,0 +1,66 @@
+// The camera experiments with the binding that the probe writes, on cameras whose formats differ from each other.
+#include "backends/linux/counters/counter_system_for_tests.h"
+#include "backends/linux/probe/probe.h"
+#include "tests/sweeps/linux_cameras.h"
+
+#include <filesystem>
+#include <fstream>
+#include <vector>
+
+namespace quazor {
+namespace {
+
+// A webcam with four formats. The largest size of each format is different, and only some reach 30 frames a second.
+FakeNode webcam(int number) {
+  FakeNode node = fakeCamera("usb-" + std::to_string(number));
+  node.formats = {
+      {fakeCode('M', 'J', 'P', 'G'), "Motion-JPEG", {{1920, 1080, {{333333, 10000000}}}}},
+      {fakeCode('Y', 'U', 'Y', 'V'), "YUYV 4:2:2", {{1280, 720, {{1, 10}}}, {640, 480, {{1, 30}, {1, 15}}}}},
+      {fakeCode('N', 'V', '1', '2'), "Y/UV 4:2:0", {{320, 240, {{1, 30}}}}},
+      {fakeCode('G', 'R', 'E', 'Y'), "8-bit grey", {{1280, 720, {{1, 15}}}}}};
+  return node;
+}
+
+class ProbedCamerasTest : public testing::Test {
+ protected:
+  ProbedCamerasTest() {
+    for (int i = 0; i < 5; ++i) kernel_->add(i, webcam(i));
+  }
+
+  Outcome run(const std::vector<std::string>& ports, Array formats) {
+    const std::filesystem::path file = kernel_->roots().sysfs.parent_path() / "binding.json";
+    std::ofstream(file)
+        << probeMachine({kernel_, kernel_->roots(), {}, std::make_shared<FakeCounters>(), file}).binding;
+    Platform platform;
+    platform.capture = makeLinuxCapture(readBinding(file), kernel_, kernel_->roots());
+    platform.clock = std::make_shared<FakeClock>(kernel_);
+    platform.concurrency = std::make_shared<ThreadConcurrency>();
+    QZCameraSyncExperiment experiment(ports, std::move(formats), 30, platform);
+    return outcomeOf(experiment, Dictionary{{"duration", 2.99}});
+  }
+
+  const std::shared_ptr<FakeV4l2Api> kernel_ = std::make_shared<FakeV4l2Api>();
+};
+
+TEST_F(ProbedCamerasTest, TheBackCamerasRunAsTheyWereProbed) {
+  const Outcome outcome = run({text(port_type::BackFacingCamera), text(port_type::BackFacingTelephotoCamera),
+                               text(port_type::BackFacingSuperWideCamera)},
+                              {16, 14, 9});
+  ASSERT_NE(outcome.result, nullptr) << outcome.error;
+  for (const char* camera : {"BackWide", "BackTele", "BackSuperWide"}) {
+    EXPECT_EQ(outcome.measured(std::string(camera) + ".Frames"), 90) << camera;
+  }
+  EXPECT_TRUE(kernel_->isIdle());
+}
+
+TEST_F(ProbedCamerasTest, TheFrontCamerasRunAsTheyWereProbed) {
+  const Outcome outcome = run({text(port_type::FrontFacingCamera), text(port_type::FrontFacingInfraredCamera)}, {1, 0});
+  ASSERT_NE(outcome.result, nullptr) << outcome.error;
+  for (const auto& [name, measurement] : outcome.result->measurements()) {
+    if (name.ends_with(".Frames")) EXPECT_EQ(measurement.value(), 90) << name;
+  }
+  EXPECT_TRUE(kernel_->isIdle());
+}
+
+}  // namespace
+}  // namespace quazor
