@@ -3,6 +3,7 @@
 #include "base/text/nearest_name.h"
 #include "contract/contract.h"
 #include "host/cli/help_texts.h"
+#include "host/cli/option_checks.h"
 #include "host/cli/option_values.h"
 #include "host/device/phone.h"
 #include "host/text/table.h"
@@ -225,15 +226,6 @@ void addRecords(CLI::App& command, RawOptions& raw, int least, int most, const s
   command.add_option("RECORD", raw.records, what)->type_name("")->required()->expected(least, most);
 }
 
-// CLI11 accepts an empty option value; quazor does not.
-void refuseEmpty(const CLI::App& command, const char* option) {
-  const CLI::Option* const given = command.get_option_no_throw(option);
-  if (given == nullptr) return;
-  const std::vector<std::string>& texts = given->results();
-  if (std::find(texts.begin(), texts.end(), std::string()) == texts.end()) return;
-  throw CommandError(ExitCode::kUsage, std::string(option) + ": the value is empty");
-}
-
 Command commandOf(const std::string& name) {
   const auto found = std::find(std::begin(kCommandNames), std::end(kCommandNames), name);
   return static_cast<Command>(found - std::begin(kCommandNames));
@@ -258,34 +250,6 @@ ReportOptions reportOf(const RawOptions& raw, bool isOfRun) {
     }
   }
   return report;
-}
-
-// --seed and --realtime have no effect on a real machine, so they are rejected there.
-void checkPhone(const CLI::App& command, const std::filesystem::path& phone) {
-  const std::optional<std::filesystem::path> binding = bindingNamed(phone);
-  if (!binding) return;
-  if (binding->empty())
-    throw CommandError(ExitCode::kUsage, "--phone 'linux:': the name or file of the binding is missing");
-  for (const char* option : {"--seed", "--realtime"}) {
-    if (command.get_option(option)->count() == 0) continue;
-    throw CommandError(ExitCode::kUsage, std::string(option) + " applies only to simulated phones; --phone '" +
-                                             phone.string() + "' is this machine, which always runs in real time");
-  }
-}
-
-// Exactly one of names, --all and --only failed must be present.
-void checkNames(const Options& options, const std::string& what) {
-  const int ways = (options.names.empty() ? 0 : 1) + (options.all ? 1 : 0) + (options.onlyFailed ? 1 : 0);
-  if (ways == 0) {
-    throw CommandError(ExitCode::kUsage,
-                       "name the " + what + " to run, or use --all; 'quazor list' shows what is available");
-  }
-  if (ways > 1 && !options.onlyFailed)
-    throw CommandError(ExitCode::kUsage, "use either names of " + what + " or --all, not both");
-  if (ways > 1) throw CommandError(ExitCode::kUsage, "--only failed cannot be combined with names or --all");
-  if (!options.onlyFailed && !options.failedOf.empty()) {
-    throw CommandError(ExitCode::kUsage, "--of requires --only failed");
-  }
 }
 
 // "list" and the phones to list, or "probe".
