@@ -99,9 +99,9 @@ class NamedPluginsTest(PluginFoldersTest):
     def test_an_unknown_name_is_told_what_there_is(self):
         shutil.copy(WORKING, self.own)
         self.assert_refused(self.quazor("list", "--plugin", "working_plugn"), 66, "the plug-in 'working_plugn'",
-                            "did you mean 'working_plugin'?", "camera_sensor_diagnostics, sensor_images, working_plugin")
+                            "did you mean 'working_plugin'?", "camera_sensor_diagnostics, sensor_images, single_camera, working_plugin")
         completed = self.quazor("__complete", "run", "--plugin", "").stdout.split()
-        self.assertEqual(completed, ["camera_sensor_diagnostics", "sensor_images", "working_plugin"])
+        self.assertEqual(completed, ["camera_sensor_diagnostics", "sensor_images", "single_camera", "working_plugin"])
 
 
 class RefusedPluginsTest(PluginFoldersTest):

@@ -3,6 +3,7 @@
 #include "backends/log/standard_error_log.h"
 #include "contract/message_format.h"
 #include "host/report/text_report.h"
+#include "host/report/variation_report.h"
 #include "host/system/output_file.h"
 #include "host/text/display_width.h"
 #include "host/text/table.h"
@@ -18,6 +19,15 @@ namespace {
 
 constexpr std::size_t kMaxNameInHeartbeat = 200;  // so that the line fits where it takesText()
 
+// Tells people who wait for a repeated run how far it is.
+std::string suffixOf(const DiagnosticStarted& diagnostic, const RunStarted& run) {
+  DiagnosticRecord record;
+  record.trial = {diagnostic.attempt, run.attempts, diagnostic.repetition, run.repetitions};
+  if (diagnostic.attempt <= 1) record.verdict = Verdict::kPass;
+  const std::string trial = trialText(record);
+  return trial.empty() ? trial : ", " + trial;
+}
+
 }  // namespace
 
 RunReport::RunReport(ReportOptions options, Console& console)
@@ -27,8 +37,10 @@ void RunReport::onEvent(const RunEvent& event) {
   if (const auto* const began = std::get_if<RunStarted>(&event)) {
     run_ = *began;
   } else if (const auto* const diagnostic = std::get_if<DiagnosticStarted>(&event)) {
-    running_ = diagnostic->name;
-    progress_.start(diagnostic->name, expectedProgressOf(diagnostic->parameters));
+    const auto place = std::find(run_.names.begin(), run_.names.end(), diagnostic->name);
+    number_ = static_cast<std::size_t>(place - run_.names.begin()) + 1;
+    running_ = diagnostic->name + suffixOf(*diagnostic, run_);
+    progress_.start(running_, expectedProgressOf(diagnostic->parameters));
   } else if (const auto* const logged = std::get_if<Logged>(&event)) {
     const LogLine& line = logged->line;
     if (line.level > options_.shownLog) return;
@@ -67,8 +79,8 @@ void RunReport::tell(const Heartbeat& event) {
   if (console_.showsProgress || (console_.takesText && !console_.takesText())) return;
   const auto seconds = std::chrono::duration_cast<std::chrono::seconds>(event.elapsed).count();
   console_.err << formatMessage("quazor: running %@ (%@ of %@), stage %@, for %@ s\n",
-                                shortened(printable(running_), kMaxNameInHeartbeat), records_.size() + 1,
-                                std::max(run_.names.size(), records_.size() + 1), nameOf(event.stage), seconds)
+                                shortened(printable(running_), kMaxNameInHeartbeat), number_,
+                                std::max(run_.names.size(), number_), nameOf(event.stage), seconds)
                << std::flush;
 }
 
@@ -109,18 +121,10 @@ void RunReport::writeFile(const OutputRequest& output, const std::optional<std::
 }
 
 ExitCode RunReport::exitCode() const {
-  return allWritten_ ? exitCodeOf(records_, options_.exitRules) : ExitCode::kCannotWrite;
-}
-
-ExitCode exitCodeOf(const std::vector<DiagnosticRecord>& records, const ExitRules& rules) {
-  const auto countOf = [&records](Verdict verdict) {
-    return std::count_if(records.begin(), records.end(),
-                         [verdict](const DiagnosticRecord& one) { return one.verdict == verdict; });
-  };
-  if (countOf(Verdict::kError) > 0) return ExitCode::kError;
-  if (countOf(Verdict::kFail) > 0) return ExitCode::kFailed;
-  const bool isSkipped = countOf(Verdict::kSkip) > 0;
-  return isSkipped && (!rules.allowSkips || countOf(Verdict::kPass) == 0) ? ExitCode::kError : ExitCode::kAllPassed;
+  if (!allWritten_) return ExitCode::kCannotWrite;
+  ExitRules rules = options_.exitRules;
+  rules.acceptFlaky = run_.acceptFlaky;
+  return exitCodeOf(records_, rules);
 }
 
 }  // namespace quazor

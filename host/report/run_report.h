@@ -5,9 +5,11 @@
 #include "host/error/exit_code.h"
 #include "host/model/diagnostic_record.h"
 #include "host/model/run_event.h"
+#include "host/model/trials.h"
 #include "host/report/progress.h"
 #include "host/report/report_format.h"
 
+#include <cstddef>
 #include <functional>
 #include <optional>
 #include <ostream>
@@ -25,11 +27,6 @@ struct Console {
   bool blocks = false;         // `out` supports UTF-8 and block elements
   // False if a short text to `err` would have to wait for its reader; empty: never.
   std::function<bool()> takesText{};
-};
-
-// What the user allows in a run with exit code 0.
-struct ExitRules {
-  bool allowSkips = false;
 };
 
 struct ReportOptions {
@@ -71,13 +68,10 @@ class RunReport final : public RunEventSink {
   Console& console_;
   Progress progress_;
   RunStarted run_;
-  std::string running_;  // the diagnostic that began last
+  std::string running_;     // the diagnostic that began last
+  std::size_t number_ = 0;  // its place among those to run
   std::vector<DiagnosticRecord> records_;
   bool allWritten_ = true;
 };
-
-// The exit code for the verdicts. An error takes precedence over a failure, and a failure over a skip that is not
-// allowed. That all were skipped is never allowed.
-ExitCode exitCodeOf(const std::vector<DiagnosticRecord>& records, const ExitRules& rules = {});
 
 }  // namespace quazor

@@ -21,7 +21,8 @@ class Folder:
     near: tuple
 
 
-DIAGNOSTICS = ("camera_sync_test", "projector_fault_test", "report_channels_test", "sensor_images_test")
+DIAGNOSTICS = ("camera_sync_test", "projector_fault_test", "report_channels_test", "sensor_images_test",
+               "single_camera_test")
 SWEEPS = ("camera_sync_sweep_test", "projector_sweep_test", "telemon_sweep_test", "sensor_images_sweep_test")
 LINUX = ("linux_test", "linux_binding_test", "linux_capture_test", "linux_counters_test", "linux_display_test",
          "linux_hid_test", "linux_probe_test", "linux_system_test", "linux_video_test")

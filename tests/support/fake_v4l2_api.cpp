@@ -345,9 +345,12 @@ int FakeV4l2Api::enumerate(const FakeNode& node, unsigned long request, void* ar
   }
   if (request != VIDIOC_QUERY_EXT_CTRL) return ENOTTY;
   auto& query = *static_cast<v4l2_query_ext_ctrl*>(argument);
-  const std::uint32_t last = query.id & ~V4L2_CTRL_FLAG_NEXT_CTRL;
-  const auto control = std::ranges::find_if(node.controls, [last](const FakeControl& one) { return one.id > last; });
+  const bool isNext = (query.id & V4L2_CTRL_FLAG_NEXT_CTRL) != 0;
+  const std::uint32_t id = query.id & ~V4L2_CTRL_FLAG_NEXT_CTRL;
+  const auto control =
+      std::ranges::find_if(node.controls, [&](const FakeControl& one) { return isNext ? one.id > id : one.id == id; });
   if (control == node.controls.end()) return EINVAL;
+  if (control->describeProblem != 0) return control->describeProblem;  // and the caller does not learn the id
   query = {};
   query.id = control->id;
   query.type = control->type;
@@ -355,6 +358,7 @@ int FakeV4l2Api::enumerate(const FakeNode& node, unsigned long request, void* ar
   copyText(query.name, control->name);
   query.minimum = control->minimum;
   query.maximum = control->maximum;
+  query.step = 1;
   query.default_value = control->value;
   return 0;
 }
@@ -366,6 +370,12 @@ int FakeV4l2Api::control(FakeNode& node, bool sets, v4l2_ext_controls& list) {
   const bool isWide = control->type == V4L2_CTRL_TYPE_INTEGER64;
   if (sets) {
     control->value = isWide ? std::int64_t{entry.value64} : std::int64_t{entry.value};
+    if (control->stuck) control->value = *control->stuck;
+    if (isWide) {
+      entry.value64 = control->value;
+    } else {
+      entry.value = static_cast<std::int32_t>(control->value);
+    }
     node.history.push_back(control->name + " = " + std::to_string(control->value));
   } else if (isWide) {
     entry.value64 = control->value;

@@ -26,6 +26,7 @@ PLUGIN_FOLDERS = {
     "diagnostics/projector_fault": {"TesselFaultDiagnostic"},
     "diagnostics/report_channels": {"TesselTelemonDiagnostic"},
     "diagnostics/sensor_images": {"NimbeImageExperiment"},
+    "diagnostics/single_camera": {"SingleCameraDiagnostic"},
 }
 CATALOGUE_FOLDERS = ["plugins", *PLUGIN_FOLDERS]
 ALL_FOLDERS = ["contract", "platform", "base", "diagnostics", "plugins", "backends", "host"]

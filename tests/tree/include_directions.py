@@ -23,7 +23,7 @@ import sys
 
 CONTRACT = ["contract", "platform"]
 DIAGNOSTICS = ["diagnostics/camera_sync", "diagnostics/projector_fault", "diagnostics/report_channels",
-               "diagnostics/sensor_images"]
+               "diagnostics/sensor_images", "diagnostics/single_camera"]
 
 # One row per folder: what its sources may include in addition to the folder itself.
 SIMULATED = "backends/simulated/"
@@ -37,6 +37,7 @@ ALLOWED = {
     "diagnostics/report_channels": CONTRACT,
     "diagnostics/projector_fault": [*CONTRACT, "diagnostics/report_channels"],
     "diagnostics/sensor_images": CONTRACT,
+    "diagnostics/single_camera": CONTRACT,
     "plugins": [*CONTRACT, *DIAGNOSTICS],
     "backends/log": [*CONTRACT, "base/text"],
     "backends/threads": CONTRACT,
@@ -55,7 +56,7 @@ ALLOWED = {
                         SIMULATED + "scenario"],
     LINUX + "system": [*CONTRACT, "backends/log", "backends/threads"],
     LINUX + "binding": [*CONTRACT, "backends/faults", "base/json", "base/text"],
-    LINUX + "video": [*CONTRACT, LINUX + "binding", LINUX + "system"],
+    LINUX + "video": [*CONTRACT, "base/text", LINUX + "binding", LINUX + "system"],
     LINUX + "capture": [*CONTRACT, "backends/capture", LINUX + "binding", LINUX + "system", LINUX + "video"],
     LINUX + "hid": [*CONTRACT, "backends/hid", "base/text", LINUX + "system"],
     LINUX + "counters": [*CONTRACT, "backends/counters", LINUX + "binding", LINUX + "system"],

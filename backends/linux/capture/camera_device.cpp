@@ -1,6 +1,7 @@
 #include "backends/linux/capture/camera_device.h"
 
 #include "backends/linux/system/linux_error.h"
+#include "contract/log_channel.h"
 #include "platform/capture_keys.h"
 
 #include <algorithm>
@@ -35,12 +36,6 @@ constexpr double kMinRate = 0.01;
 
 }  // namespace
 
-FrameInterval intervalFor(double framesPerSecond) {
-  const double whole = std::round(framesPerSecond);
-  if (whole > 0 && std::abs(framesPerSecond - whole) < 1e-6) return {1, static_cast<std::uint32_t>(whole)};
-  return {1000, static_cast<std::uint32_t>(std::lround(framesPerSecond * 1000))};
-}
-
 LinuxCamera::LinuxCamera(CameraBinding binding, std::shared_ptr<LinuxCameras> cameras)
     : binding_(std::move(binding)), info_(infoOf(binding_)), cameras_(std::move(cameras)) {}
 
@@ -50,6 +45,10 @@ bool LinuxCamera::open(CameraSettings& settings, DiagnosticErrorPtr* error) {
   if (node_ != nullptr && binding_.metadata.node) {
     metadataNode_ = openMatching(kernel, nodes, VideoNodeKind::kMetadata, *binding_.metadata.node, port(), error);
     if (metadataNode_ == nullptr) node_.reset();
+  }
+  if (node_ != nullptr && !node_->undescribedControls().empty()) {
+    logDefault("%@: the driver of %@ does not describe the controls %@; they cannot be used.", port(), node_->path(),
+               node_->undescribedControls());
   }
   const bool opened = node_ != nullptr && prepare(error);
   if (opened) settings.autoExposure = exposesAutomatically();
@@ -62,10 +61,11 @@ bool LinuxCamera::prepare(DiagnosticErrorPtr* error) {
          node_->set(binding_.controls, error);
 }
 
+// A control that cannot be read is taken for automatic: nothing shows that it is off.
 bool LinuxCamera::exposesAutomatically() const {
   const VideoControl* const control = node_->controlOfId(V4L2_CID_EXPOSURE_AUTO);
-  if (control == nullptr) return false;
-  return node_->read(*control, nullptr).value_or(V4L2_EXPOSURE_MANUAL) != V4L2_EXPOSURE_MANUAL;
+  if (control == nullptr) return node_->mayHaveControl(V4L2_CID_EXPOSURE_AUTO);
+  return node_->read(*control, nullptr).value_or(V4L2_EXPOSURE_AUTO) != V4L2_EXPOSURE_MANUAL;
 }
 
 void LinuxCamera::close() {
@@ -80,12 +80,14 @@ const FormatBinding* LinuxCamera::formatOf(const CameraSettings& settings) const
   return found == binding_.formats.end() ? nullptr : &*found;
 }
 
+VideoMode LinuxCamera::modeOf(const CameraSettings& settings) const {
+  const FormatBinding* const bound = formatOf(settings);
+  if (bound != nullptr) return {bound->index, bound->fourcc, bound->width, bound->height};
+  return {static_cast<std::uint32_t>(toUnsigned(&settings.formatIndex)), {}, binding_.width, binding_.height};
+}
+
 bool LinuxCamera::applyFormat(const CameraSettings& wanted, DiagnosticErrorPtr* error) {
-  VideoMode mode{static_cast<std::uint32_t>(toUnsigned(&wanted.formatIndex)), {}, binding_.width, binding_.height};
-  if (const FormatBinding* const bound = formatOf(wanted)) {
-    mode = {bound->index, bound->fourcc, bound->width, bound->height};
-  }
-  return node_->setFormat(mode, error);
+  return node_->setFormat(modeOf(wanted), error);
 }
 
 bool LinuxCamera::applyRates(const CameraSettings& wanted, DiagnosticErrorPtr* error) {
@@ -120,7 +122,9 @@ std::optional<FrameInterval> LinuxCamera::intervalOf(const CameraSettings& setti
                 port(), format->index, textOf(wanted), wanted.framesPerSecond());
     return std::nullopt;
   }
-  const std::optional<FrameInterval> given = node_->setInterval(wanted, error);
+  const VideoMode mode = modeOf(settings);
+  const RateRequest request{port(), mode.index, mode.width, mode.height, wanted, bound.has_value()};
+  const std::optional<FrameInterval> given = setRate(*node_, request, error);
   if (!given || fits(*given)) return given;
   refuseLinux(
       error, LinuxErrorCode::kNotSupported,
@@ -133,6 +137,12 @@ std::optional<FrameInterval> LinuxCamera::intervalOf(const CameraSettings& setti
 bool LinuxCamera::applyAutoExposure(const CameraSettings& wanted, DiagnosticErrorPtr* error) {
   const bool isAutomatic = *wanted.autoExposure.boolean();
   const VideoControl* const control = node_->controlOfId(V4L2_CID_EXPOSURE_AUTO);
+  if (control == nullptr && node_->mayHaveControl(V4L2_CID_EXPOSURE_AUTO)) {
+    return refuseLinux(
+        error, LinuxErrorCode::kNotSupported,
+        "%@: automatic exposure of %@ cannot be set, because its driver does not describe the controls %@.", port(),
+        node_->path(), node_->undescribedControls());
+  }
   if (control == nullptr && isAutomatic) {
     return refuseLinux(error, LinuxErrorCode::kNotSupported, "%@: %@ has no automatic exposure.", port(),
                        node_->path());

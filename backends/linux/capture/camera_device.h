@@ -3,6 +3,7 @@
 
 #include "backends/capture/capture_back.h"
 #include "backends/linux/binding/binding.h"
+#include "backends/linux/capture/camera_rate.h"
 #include "backends/linux/capture/camera_run.h"
 #include "backends/linux/video/v4l2_device_info.h"
 #include "contract/value.h"
@@ -26,12 +27,6 @@ struct LinuxCameras {
   const std::shared_ptr<DeliveredFrames> delivered = std::make_shared<DeliveredFrames>(0);
   std::vector<V4l2DeviceInfo> nodes;  // as found before the cameras were opened
 };
-
-// The tolerance of a frame rate, relative to the requested one: 29.97 is accepted for 30.
-inline constexpr double kRateTolerance = 0.002;
-
-// The shortest exact fraction for a rate: seconds per frame.
-FrameInterval intervalFor(double framesPerSecond);
 
 // Thread: one at a time.
 class LinuxCamera final : public CameraBack {
@@ -62,6 +57,7 @@ class LinuxCamera final : public CameraBack {
   const std::string& port() const { return binding_.port; }
   bool prepare(DiagnosticErrorPtr* error);
   bool exposesAutomatically() const;
+  VideoMode modeOf(const CameraSettings& settings) const;
   const FormatBinding* formatOf(const CameraSettings& settings) const;
   std::optional<FrameInterval> intervalOf(const CameraSettings& wanted, DiagnosticErrorPtr* error);
   std::vector<ControlSetting> lightOf(const Value& configuration) const;

@@ -234,6 +234,9 @@ class CameraProbe {
     }
     tellFormats(formats, lines_);
     tellControls(details->controls, lines_);
+    if (!details->undescribedControls.empty()) {
+      tell("    The driver does not describe the controls " + details->undescribedControls + "; they cannot be used.");
+    }
   }
 
   void bind(const V4l2DeviceInfo& node, const ChosenMode& mode, const std::vector<VideoFormat>& formats) {

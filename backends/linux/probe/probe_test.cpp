@@ -105,7 +105,8 @@ TEST_F(ProbeTest, MakesNoGroupOfOneCamera) {
 
 TEST_F(ProbeTest, TellsWhatACameraOffers) {
   FakeNode node = fakeCamera("fake:0");
-  node.controls = {{1, "Gain", 0, 10, 5}, {2, "Flash", 0, 1, 0}};
+  node.controls = {{1, "Gain", 0, 10, 5}, {2, "Flash", 0, 1, 0}, {V4L2_CID_CONTRAST, "Contrast"}};
+  node.controls[2].describeProblem = EPIPE;
   node.formats.push_back({V4L2_PIX_FMT_NV12, "other sizes", {{320, 180, {{1001, 30000}}}}});
   kernel_->add(0, node);
   const std::vector<std::string> told = lines();
@@ -114,6 +115,7 @@ TEST_F(ProbeTest, TellsWhatACameraOffers) {
   EXPECT_THAT(told, Contains("    format 2: NV12 (other sizes)"));
   EXPECT_THAT(told, Contains("      320x180 at 29.97 frames a second"));
   EXPECT_THAT(told, Contains("    controls: Gain, Flash"));
+  EXPECT_THAT(told, Contains("    The driver does not describe the controls 0x00980901 (EPIPE); they cannot be used."));
 }
 
 TEST_F(ProbeTest, ChoosesTheLargestSizeAtTheUsualRate) {

@@ -21,20 +21,24 @@ LinuxErrorCode codeOf(int number) {
 
 }  // namespace
 
+std::string errorName(int number) {
+  const char* const name = ::strerrorname_np(number);
+  return name != nullptr ? name : std::to_string(number);
+}
+
 void failLinux(DiagnosticErrorPtr* error, LinuxErrorCode code, std::string message) {
   if (error != nullptr)
     *error = errorWithMessage(LinuxErrorDomain, static_cast<std::int64_t>(code), std::move(message), nullptr);
 }
 
 void failSystemCall(DiagnosticErrorPtr* error, std::string_view call, std::string_view object, int number) {
-  const char* const name = ::strerrorname_np(number);
   std::string message(call);
   message += " on ";
   message += object;
   message += " failed: ";
   message += std::strerror(number);
   message += " (";
-  message += name != nullptr ? name : std::to_string(number);
+  message += errorName(number);
   message += ")";
   failLinux(error, codeOf(number), std::move(message));
 }

@@ -32,6 +32,9 @@ enum class LinuxErrorCode : std::int64_t {
 // True for the errno values that mean a missing permission.
 inline bool isNoAccess(int number) { return number == EACCES || number == EPERM; }
 
+// "EPIPE"; the number itself if it has no name.
+std::string errorName(int number);
+
 // Stores an error unless `error` is null.
 void failLinux(DiagnosticErrorPtr* error, LinuxErrorCode code, std::string message);
 // Like failLinux(), with a format; returns false.

@@ -1,6 +1,7 @@
 #include "backends/linux/video/v4l2_device.h"
 
 #include "backends/linux/system/linux_error.h"
+#include "base/text/hexadecimal.h"
 #include "contract/message_format.h"
 
 #include <algorithm>
@@ -33,6 +34,17 @@ v4l2_ext_controls listOfOne(v4l2_ext_control& control) {
 }
 
 bool is64Bit(const VideoControl& control) { return control.type == V4L2_CTRL_TYPE_INTEGER64; }
+
+// Buttons have no value, and volatile controls may change at any time.
+bool keepsItsValue(const VideoControl& control) {
+  constexpr std::uint32_t kChanging = V4L2_CTRL_FLAG_VOLATILE | V4L2_CTRL_FLAG_WRITE_ONLY;
+  return control.type != V4L2_CTRL_TYPE_BUTTON && (control.flags & kChanging) == 0;
+}
+
+VideoControl controlOf(const v4l2_query_ext_ctrl& query) {
+  return {query.id,   query.type, fixedText(query.name), query.minimum, query.maximum, query.default_value,
+          query.step, query.flags};
+}
 
 }  // namespace
 
@@ -201,30 +213,100 @@ std::optional<FrameInterval> V4l2Device::interval(DiagnosticErrorPtr* error) con
   return intervalOf(parameters.parm.capture.timeperframe);
 }
 
-std::optional<FrameInterval> V4l2Device::setInterval(FrameInterval wanted, DiagnosticErrorPtr* error) {
+int V4l2Device::setInterval(FrameInterval* interval) {
   v4l2_streamparm parameters{};
   parameters.type = V4L2_BUF_TYPE_VIDEO_CAPTURE;
-  parameters.parm.capture.timeperframe = {wanted.numerator, wanted.denominator};
-  if (!call(VIDIOC_S_PARM, "VIDIOC_S_PARM", &parameters, error)) return std::nullopt;
-  return intervalOf(parameters.parm.capture.timeperframe);
+  parameters.parm.capture.timeperframe = {interval->numerator, interval->denominator};
+  const int result = call(VIDIOC_S_PARM, &parameters);
+  if (result == 0) *interval = intervalOf(parameters.parm.capture.timeperframe);
+  return result;
 }
 
+int V4l2Device::query(std::uint32_t id, v4l2_query_ext_ctrl* query) const {
+  *query = {};
+  query->id = id;
+  return call(VIDIOC_QUERY_EXT_CTRL, query);
+}
+
+void V4l2Device::add(const v4l2_query_ext_ctrl& query) {
+  const bool isHeading = query.type == V4L2_CTRL_TYPE_CTRL_CLASS;
+  if (!isHeading && (query.flags & V4L2_CTRL_FLAG_DISABLED) == 0) controls_.push_back(controlOf(query));
+}
+
+// Only EINVAL ends the list. Any other error concerns one control, whose id the driver then does not report.
 void V4l2Device::listControls() {
-  v4l2_query_ext_ctrl query{};
+  std::uint32_t last = 0;
   for (std::uint32_t i = 0; i < kMaxItems; ++i) {
-    query.id |= V4L2_CTRL_FLAG_NEXT_CTRL;
-    if (call(VIDIOC_QUERY_EXT_CTRL, &query) != 0) return;
-    const bool isHeading = query.type == V4L2_CTRL_TYPE_CTRL_CLASS;
-    if (isHeading || (query.flags & V4L2_CTRL_FLAG_DISABLED) != 0) continue;
-    controls_.push_back(
-        {query.id, query.type, fixedText(query.name), query.minimum, query.maximum, query.default_value});
+    v4l2_query_ext_ctrl found{};
+    const int result = query(last | V4L2_CTRL_FLAG_NEXT_CTRL, &found);
+    if (result == EINVAL || result == ENOTTY) return;
+    if (result == 0) {
+      add(found);
+      last = found.id;
+      continue;
+    }
+    const std::optional<std::uint32_t> next = nextExistingControl(last);
+    if (!next) {
+      undescribed_.push_back({last, result, true});
+      return;
+    }
+    const int problem = query(*next, &found);
+    if (problem == 0) {
+      add(found);
+    } else {
+      undescribed_.push_back({*next, problem});
+    }
+    last = *next;
   }
+}
+
+// The first control after `last`, found by asking for each id of the known classes: a control that exists but cannot be
+// described fails with another error than EINVAL.
+std::optional<std::uint32_t> V4l2Device::nextExistingControl(std::uint32_t last) const {
+  constexpr std::uint32_t kFirstClass = V4L2_CTRL_CLASS_USER;
+  constexpr std::uint32_t kLastClass = V4L2_CTRL_CLASS_USER + 0x1f0000;  // there are 14 classes in Linux 6.1
+  constexpr std::uint32_t kFirstOfClass = 0x900;
+  constexpr std::uint32_t kLastOfClass = 0x1fff;  // drivers have their own controls from 0x1000 on
+  for (std::uint32_t group = kFirstClass; group <= kLastClass; group += 0x10000) {
+    for (std::uint32_t id = std::max(group + kFirstOfClass, last + 1); id <= group + kLastOfClass; ++id) {
+      v4l2_query_ext_ctrl found{};
+      const int result = query(id, &found);
+      if (result == ENODEV) return std::nullopt;
+      if (result != EINVAL) return id;
+    }
+  }
+  return std::nullopt;
+}
+
+std::string V4l2Device::undescribedControls() const {
+  std::string text;
+  for (const UndescribedControl& one : undescribed_) {
+    text += (text.empty() ? "" : ", ") + std::string(one.endsList ? "after " : "") + hexadecimalNumber(one.id, 8) +
+            " (" + errorName(one.problem) + ")";
+  }
+  return text;
+}
+
+bool V4l2Device::mayHaveControl(std::uint32_t id) const {
+  return controlOfId(id) != nullptr || std::ranges::any_of(undescribed_, [id](const UndescribedControl& one) {
+           return one.endsList ? one.id < id : one.id == id;
+         });
+}
+
+std::optional<VideoControl> V4l2Device::describe(std::uint32_t id, DiagnosticErrorPtr* error) const {
+  v4l2_query_ext_ctrl found{};
+  const int result = query(id, &found);
+  if (result == 0) return controlOf(found);
+  failSystemCall(error, "VIDIOC_QUERY_EXT_CTRL of " + hexadecimalNumber(id, 8), path_, result);
+  return std::nullopt;
 }
 
 const VideoControl* V4l2Device::control(std::string_view name, DiagnosticErrorPtr* error) const {
   const auto found = std::ranges::find(controls_, name, &VideoControl::name);
   if (found != controls_.end()) return &*found;
-  failLinux(error, LinuxErrorCode::kNotSupported, formatMessage("%@ has no control \"%@\".", path_, name));
+  const std::string undescribed = undescribedControls();
+  refuseLinux(error, LinuxErrorCode::kNotSupported, "%@ has no control \"%@\"%@.", path_, name,
+              undescribed.empty() ? "" : "; its driver does not describe the controls " + undescribed);
   return nullptr;
 }
 
@@ -261,8 +343,14 @@ bool V4l2Device::set(const VideoControl& control, std::int64_t value, Diagnostic
   }
   v4l2_ext_controls list = listOfOne(entry);
   const int result = call(VIDIOC_S_EXT_CTRLS, &list);
-  if (result != 0) failSystemCall(error, "VIDIOC_S_EXT_CTRLS of \"" + control.name + "\"", path_, result);
-  return result == 0;
+  if (result != 0) {
+    failSystemCall(error, "VIDIOC_S_EXT_CTRLS of \"" + control.name + "\"", path_, result);
+    return false;
+  }
+  const std::int64_t made = is64Bit(control) ? std::int64_t{entry.value64} : std::int64_t{entry.value};
+  if (made == value || !keepsItsValue(control)) return true;
+  return refuseLinux(error, LinuxErrorCode::kBadValue, "%@: the driver set the control \"%@\" to %@ instead of %@.",
+                     path_, control.name, made, value);
 }
 
 bool V4l2Device::set(const std::vector<ControlSetting>& settings, DiagnosticErrorPtr* error) {

@@ -59,15 +59,22 @@ class V4l2Device final {
   bool setFormat(const VideoMode& mode, DiagnosticErrorPtr* error);
   // The current time between frames; nothing and an error if the driver cannot report it.
   std::optional<FrameInterval> interval(DiagnosticErrorPtr* error) const;
-  // Requests an interval and returns the one that the driver has set, which may differ.
-  std::optional<FrameInterval> setInterval(FrameInterval wanted, DiagnosticErrorPtr* error);
+  // Requests an interval and changes it to the one that the driver has set. Returns 0 or the error number, which is
+  // ENOTTY for a driver that sets no intervals.
+  int setInterval(FrameInterval* interval);
 
   const std::vector<VideoControl>& controls() const { return controls_; }
   // The control with that name; null and an error (kNotSupported) if there is none.
   const VideoControl* control(std::string_view name, DiagnosticErrorPtr* error) const;
   const VideoControl* controlOfId(std::uint32_t id) const;
+  // The present description of a control: some ranges change with the format. Nothing and an error if there is none.
+  std::optional<VideoControl> describe(std::uint32_t id, DiagnosticErrorPtr* error) const;
+  // The controls that the driver failed to describe: "0x00980901 (EPIPE)"; empty if there is none.
+  std::string undescribedControls() const;
+  // False if the camera certainly lacks the control; true also for one that the driver failed to describe.
+  bool mayHaveControl(std::uint32_t id) const;
   std::optional<std::int64_t> read(const VideoControl& control, DiagnosticErrorPtr* error) const;
-  // Fails (kBadValue) if the value is out of the control's range.
+  // Fails (kBadValue) if the value is out of the control's range, or if the driver sets another one.
   bool set(const VideoControl& control, std::int64_t value, DiagnosticErrorPtr* error);
   // Sets the controls in order until one fails.
   bool set(const std::vector<ControlSetting>& settings, DiagnosticErrorPtr* error);
@@ -80,7 +87,16 @@ class V4l2Device final {
  private:
   V4l2Device(std::shared_ptr<V4l2Api> kernel, std::string path, int descriptor);
 
+  struct UndescribedControl {
+    std::uint32_t id = 0;  // of the last control before the end of the list, if `endsList`
+    int problem = 0;       // an error number
+    bool endsList = false;
+  };
+
   void listControls();
+  int query(std::uint32_t id, v4l2_query_ext_ctrl* query) const;
+  void add(const v4l2_query_ext_ctrl& query);
+  std::optional<std::uint32_t> nextExistingControl(std::uint32_t last) const;
   std::optional<std::uint32_t> pixelFormatOf(const VideoMode& mode, DiagnosticErrorPtr* error) const;
   std::vector<FrameSize> sizesOf(std::uint32_t fourcc) const;
   void listIntervals(std::uint32_t fourcc, FrameSize& size) const;
@@ -90,6 +106,7 @@ class V4l2Device final {
   const int descriptor_;
   v4l2_capability capability_{};
   std::vector<VideoControl> controls_;
+  std::vector<UndescribedControl> undescribed_;
 };
 
 // The text of a fixed-size kernel field, which has no null if it is full.

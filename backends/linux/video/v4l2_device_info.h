@@ -39,6 +39,8 @@ struct VideoControl {
   std::int64_t minimum = 0;
   std::int64_t maximum = 0;
   std::int64_t defaultValue = 0;
+  std::uint64_t step = 1;
+  std::uint32_t flags = 0;  // V4L2_CTRL_FLAG_...
 };
 
 enum class VideoNodeKind {
@@ -63,6 +65,7 @@ struct V4l2DeviceInfo {
 struct VideoNodeDetails {
   std::vector<VideoFormat> formats;
   std::vector<VideoControl> controls;
+  std::string undescribedControls;  // V4l2Device::undescribedControls()
 };
 
 // The directories of the system's devices.

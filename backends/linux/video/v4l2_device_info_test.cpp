@@ -206,6 +206,65 @@ TEST(OpenedVideoNodeTest, ControlsKeepTheirRangesAndTheirWidth) {
   EXPECT_FALSE(valueFor(*node->control("Narrow", nullptr), 1).is64Bit);
 }
 
+TEST(OpenedVideoNodeTest, AControlThatCannotBeDescribedDoesNotEndTheList) {
+  const Kernel kernel = std::make_shared<FakeV4l2Api>();
+  FakeNode camera = fakeCamera("fake:0");
+  camera.controls = {{V4L2_CID_BRIGHTNESS, "Brightness"},
+                     {V4L2_CID_CONTRAST, "Contrast"},
+                     {V4L2_CID_SATURATION, "Saturation"},
+                     {V4L2_CID_HUE, "Hue"},
+                     {V4L2_CID_GAIN, "Gain"},
+                     {V4L2_CID_EXPOSURE_AUTO, "Auto Exposure", 0, 3, 1, V4L2_CTRL_TYPE_MENU},
+                     {V4L2_CID_PRIVACY, "Privacy"}};
+  camera.controls[1].describeProblem = EPIPE;
+  camera.controls[3].describeProblem = EIO;
+  camera.controls[6].describeProblem = EIO;
+  const std::string path = kernel->add(0, camera);
+  const auto node = V4l2Device::open(kernel, path, nullptr);
+  ASSERT_NE(node, nullptr);
+  std::string names;
+  for (const VideoControl& control : node->controls()) names += control.name + " ";
+  EXPECT_EQ(names, "Brightness Saturation Gain Auto Exposure ");
+  const std::string undescribed = "0x00980901 (EPIPE), 0x00980903 (EIO), 0x009A0910 (EIO)";
+  EXPECT_EQ(node->undescribedControls(), undescribed);
+  EXPECT_EQ(
+      outcome([&](auto* error) { return node->control("Contrast", error); }),
+      "5 " + path + " has no control \"Contrast\"; its driver does not describe the controls " + undescribed + ".");
+  EXPECT_TRUE(node->mayHaveControl(V4L2_CID_CONTRAST));
+  EXPECT_FALSE(node->mayHaveControl(V4L2_CID_BACKLIGHT_COMPENSATION));
+}
+
+TEST(OpenedVideoNodeTest, AListThatCannotBeReadMayHaveAnyControl) {
+  const Kernel kernel = std::make_shared<FakeV4l2Api>();
+  FakeNode camera = fakeCamera("fake:0");
+  camera.controls = {{V4L2_CID_BRIGHTNESS, "Brightness"}, {0x0f000000, "of no known class"}};
+  camera.controls[1].describeProblem = EIO;
+  const auto node = V4l2Device::open(kernel, kernel->add(0, camera), nullptr);
+  EXPECT_EQ(node->controls().size(), 1U);
+  EXPECT_EQ(node->undescribedControls(), "after 0x00980900 (EIO)");
+  EXPECT_TRUE(node->mayHaveControl(V4L2_CID_EXPOSURE_AUTO));
+}
+
+TEST(OpenedVideoNodeTest, AControlThatTheDriverSetsToAnotherValueIsRefused) {
+  const Kernel kernel = std::make_shared<FakeV4l2Api>();
+  FakeNode camera = fakeCamera("fake:0");
+  camera.controls = {
+      {1, "Narrow", 0, 100, 5}, {2, "Wide", 0, 1LL << 40, 5, V4L2_CTRL_TYPE_INTEGER64}, {3, "Volatile", 0, 100, 5}};
+  camera.controls[0].stuck = 98;
+  camera.controls[1].stuck = 1LL << 33;
+  camera.controls[2].stuck = 7;
+  camera.controls[2].flags = V4L2_CTRL_FLAG_VOLATILE;
+  const std::string path = kernel->add(0, camera);
+  const auto node = V4l2Device::open(kernel, path, nullptr);
+  const auto set = [&](const char* name, std::int64_t value) {
+    return outcome([&](auto* error) { return node->set(*node->control(name, nullptr), value, error); });
+  };
+  EXPECT_EQ(set("Narrow", 99), "6 " + path + ": the driver set the control \"Narrow\" to 98 instead of 99.");
+  EXPECT_EQ(set("Narrow", 98), "done");
+  EXPECT_EQ(set("Wide", 1), "6 " + path + ": the driver set the control \"Wide\" to 8589934592 instead of 1.");
+  EXPECT_EQ(set("Volatile", 99), "done") << "the device changes it itself";
+}
+
 TEST(OpenedVideoNodeTest, AFormatThatTheDriverChangesAsItIsSetIsRefused) {
   class ChangingKernel final : public FakeV4l2Api {
    public:
@@ -218,7 +277,9 @@ TEST(OpenedVideoNodeTest, AFormatThatTheDriverChangesAsItIsSetIsRefused) {
   const auto kernel = std::make_shared<ChangingKernel>();
   const std::string path = kernel->add(0, fakeCamera("fake:0"));
   const auto node = V4l2Device::open(kernel, path, nullptr);
-  EXPECT_EQ(outcome([&](auto* error) { return node->setFormat({1, {}, 640, 360}, error); }),
+  EXPECT_EQ(outcome([&](auto* error) {
+              return node->setFormat({1, {}, 640, 360}, error);
+            }),
             "5 " + path + ": format 1 (GREY) of 640 x 360 is not available; the driver offers GREY of 640 x 352.");
 }
 
