@@ -377,10 +377,9 @@ RunEvent readSkipped(const Json& json) {
 }
 
 Json jsonOf(const Heartbeat& event) {
-  return {{"event", "heartbeat"},
-          {"stage", nameOf(event.stage)},
-          {"nanoseconds", event.elapsed.count()},
-          {"date", timestampText(event.date)}};
+  Json json = jsonOf(StageEnded{event.stage, event.elapsed, event.date});
+  json["event"] = "heartbeat";
+  return json;
 }
 
 RunEvent readHeartbeat(const Json& json) {
