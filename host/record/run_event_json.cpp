@@ -2,10 +2,10 @@
 
 #include "base/text/input_error.h"
 #include "host/plugin/parameter_range.h"
+#include "host/record/json_members.h"
 #include "host/record/lossless_json.h"
 #include "host/text/timestamp.h"
 
-#include <concepts>
 #include <string>
 #include <string_view>
 #include <utility>
@@ -17,36 +17,10 @@ using Json = nlohmann::ordered_json;
 
 namespace {
 
-template <class T>
-bool isInteger(const Json& json) {
-  if (json.is_number_unsigned()) return std::in_range<T>(json.get<std::uint64_t>());
-  return json.is_number_integer() && std::in_range<T>(json.get<std::int64_t>());
-}
-
-template <class T>
-T get(const Json& json, const char* key) {
-  const Json& member = memberOf(json, key);
-  bool fits = true;
-  if constexpr (std::integral<T> && !std::same_as<T, bool>) fits = isInteger<T>(member);
-  try {
-    if (fits) return member.get<T>();
-  } catch (const Json::exception&) {
-  }
-  throw InputError(std::string("\"") + key + "\" has the wrong type");
-}
-
-std::string textAt(const Json& json, const char* key) { return textFrom(memberOf(json, key)); }
-
 Date dateAt(const Json& json, const char* key) {
   const std::optional<Date> date = parseTimestamp(get<std::string>(json, key));
   if (!date) throw InputError(std::string("\"") + key + "\" is not a timestamp of the years 1678 to 2261");
   return *date;
-}
-
-const Json& arrayAt(const Json& json, const char* key) {
-  const Json& array = memberOf(json, key);
-  if (!array.is_array()) throw InputError(std::string("\"") + key + "\" is not an array");
-  return array;
 }
 
 Stage stageAt(const Json& json, const char* key) {
