@@ -64,6 +64,7 @@ FakeV4l2Api::~FakeV4l2Api() { std::filesystem::remove_all(roots_.sysfs.parent_pa
 std::string FakeV4l2Api::add(int number, FakeNode node) {
   const std::string name = "video" + std::to_string(number);
   const std::filesystem::path folder = roots_.sysfs / "class" / "video4linux" / name;
+  std::filesystem::remove_all(folder);
   std::filesystem::create_directories(folder);
   std::ofstream(folder / "name") << node.card << " node\n";
   node.path = (roots_.dev / name).string();
@@ -199,6 +200,13 @@ int FakeV4l2Api::open(const std::string& path) {
   return lastDescriptor_;
 }
 
+int FakeV4l2Api::openForQueries(const std::string& path) {
+  const int descriptor = open(path);
+  const std::lock_guard lock(mutex_);
+  if (descriptor >= 0) ++nodes_.at(path).queried;
+  return descriptor;
+}
+
 void FakeV4l2Api::close(int descriptor) {
   const std::lock_guard lock(mutex_);
   if (events_.erase(descriptor) > 0) return;
@@ -248,6 +256,9 @@ int FakeV4l2Api::call(FakeNode& node, int descriptor, unsigned long request, voi
       capability.device_caps = node.capabilities;
       return 0;
     }
+    case VIDIOC_G_FMT:
+      if (!isMetadata(node)) return ENOTTY;
+      return format(node, false, *static_cast<v4l2_format*>(argument));
     case VIDIOC_TRY_FMT:
     case VIDIOC_S_FMT: return format(node, request == VIDIOC_S_FMT, *static_cast<v4l2_format*>(argument));
     case VIDIOC_G_PARM:
@@ -291,6 +302,10 @@ int FakeV4l2Api::call(FakeNode& node, int descriptor, unsigned long request, voi
 }
 
 int FakeV4l2Api::format(FakeNode& node, bool sets, v4l2_format& format) const {
+  if (isMetadata(node)) {
+    format.fmt.meta = node.metadataFormat;
+    return 0;
+  }
   v4l2_pix_format& wanted = format.fmt.pix;
   if (sets && node.buffers > 0) return EBUSY;
   if (sizeOf(node, wanted.pixelformat, wanted.width, wanted.height) == nullptr) {
@@ -417,6 +432,10 @@ short FakeV4l2Api::eventsOf(int descriptor) {
 }
 
 int FakeV4l2Api::poll(std::span<pollfd> descriptors, std::chrono::nanoseconds timeout) {
+  if (pollProblem != 0) {
+    ++failedPolls;
+    return -pollProblem;
+  }
   std::unique_lock lock(mutex_);
   const std::chrono::nanoseconds end = now_ + timeout;
   int ready = 0;
@@ -461,11 +480,11 @@ std::chrono::nanoseconds FakeV4l2Api::now() {
   return now_;
 }
 
-std::unique_ptr<ControlGuard> FakeV4l2Api::guardControls(const std::string& path, const std::vector<ControlValue>& off,
-                                                         int* number) {
+std::unique_ptr<ControlGuard> FakeV4l2Api::guardControls(const std::string& path, int descriptor,
+                                                         const std::vector<ControlValue>& off, int* number) {
   const std::lock_guard lock(mutex_);
-  *number = guardProblem;
-  if (guardProblem != 0) return nullptr;
+  *number = descriptors_.at(descriptor) == path ? guardProblem : ENODEV;
+  if (*number != 0) return nullptr;
   ++guards_;
   nodes_.at(path).history.emplace_back("guard began");
   return std::make_unique<Guard>(*this, nodes_.at(path), off);

@@ -85,6 +85,21 @@ std::vector<ControlSetting> readSettings(const JsonCursor& cursor) {
   return settings;
 }
 
+// Drivers pad shorter codes with spaces.
+std::string readFourcc(const JsonCursor& cursor) {
+  constexpr std::string_view kBigEndian = "-BE";
+  constexpr std::size_t kLength = 4;
+  std::string code = cursor.text();
+  const bool isBigEndian = code.size() > kLength && code.ends_with(kBigEndian);
+  if (isBigEndian) code.resize(code.size() - kBigEndian.size());
+  const bool isPrintable = std::ranges::all_of(code, [](char one) { return one >= ' ' && one <= '~'; });
+  if (code.size() > kLength || !isPrintable) {
+    cursor.fail("must be the code of a format, such as \"YUYV\"; 'quazor phone probe' shows the camera's codes.");
+  }
+  code.resize(kLength, ' ');
+  return isBigEndian ? code + std::string(kBigEndian) : code;
+}
+
 MetadataField readField(const std::string& key, const JsonCursor& cursor) {
   cursor.allowKeys({"offset", "bytes", "shift", "mask"});
   MetadataField field;
@@ -105,12 +120,16 @@ MetadataField readField(const std::string& key, const JsonCursor& cursor) {
 }
 
 MetadataBinding readMetadata(const JsonCursor& cursor) {
-  cursor.allowKeys({"constants", "node", "fields", "controls"});
+  cursor.allowKeys({"constants", "node", "format", "fields", "controls"});
   MetadataBinding metadata;
   if (const auto constants = cursor.find("constants")) {
     for (const auto& [key, value] : namedEntries(*constants)) metadata.constants.set(key, value.scalar());
   }
   if (const auto node = cursor.find("node")) metadata.node = readMatch(*node);
+  if (const auto format = cursor.find("format")) {
+    if (!metadata.node) format->fail("\"format\" requires a metadata \"node\".");
+    metadata.format = readFourcc(*format);
+  }
   if (const auto fields = cursor.find("fields")) {
     if (!metadata.node) fields->fail("\"fields\" requires a metadata \"node\".");
     for (const auto& [key, value] : namedEntries(*fields)) metadata.fields.push_back(readField(key, value));
@@ -166,21 +185,6 @@ std::uint32_t readFormatIndex(const std::string& key, const JsonCursor& cursor) 
   const auto [parsed, problem] = std::from_chars(key.data(), end, index);
   if (problem == std::errc() && parsed == end && std::to_string(index) == key) return index;
   cursor.fail(inQuotes(key) + " is not a format index; expected a whole number, such as \"16\".");
-}
-
-// Drivers pad shorter codes with spaces.
-std::string readFourcc(const JsonCursor& cursor) {
-  constexpr std::string_view kBigEndian = "-BE";
-  constexpr std::size_t kLength = 4;
-  std::string code = cursor.text();
-  const bool isBigEndian = code.size() > kLength && code.ends_with(kBigEndian);
-  if (isBigEndian) code.resize(code.size() - kBigEndian.size());
-  const bool isPrintable = std::ranges::all_of(code, [](char one) { return one >= ' ' && one <= '~'; });
-  if (code.size() > kLength || !isPrintable) {
-    cursor.fail("must be the code of a format, such as \"YUYV\"; 'quazor phone probe' shows the camera's codes.");
-  }
-  code.resize(kLength, ' ');
-  return isBigEndian ? code + std::string(kBigEndian) : code;
 }
 
 FrameInterval readInterval(const JsonCursor& cursor) {

@@ -57,6 +57,7 @@ struct MetadataControl {
 struct MetadataBinding {
   Dictionary constants;
   std::optional<VideoNodeMatch> node;  // a metadata node; its buffers are matched to frames by time stamp
+  std::optional<std::string> format;   // of that node, as FormatBinding::fourcc; nothing: any
   std::vector<MetadataField> fields;   // fields of those buffers; empty without a node
   std::vector<MetadataControl> controls;
 };

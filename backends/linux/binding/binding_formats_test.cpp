@@ -45,5 +45,17 @@ TEST_F(BindingTest, RefusesFormatsThatCannotBe) {
   for (const Refused& row : kRows) EXPECT_THAT(problemOf(row.text), ::testing::StartsWith(row.problem)) << row.what;
 }
 
+TEST_F(BindingTest, MetadataMayHaveAFormat) {
+  const auto withMetadata = [](const std::string& entries) { return withCamera("\"metadata\": {" + entries + "}"); };
+  const std::string node = R"("node": {"card": "m"}, "fields": {"K": {"offset": 0}}, )";
+  EXPECT_EQ(read(withMetadata(node + R"("format": "UVC")")).cameras.at(0).metadata.format, "UVC ");
+  EXPECT_EQ(
+      problemOf(withMetadata(node + "\"format\": \"UVC header\"")),
+      "F:3: cameras.BackFacingCamera.metadata.format: must be the code of a format, such as \"YUYV\"; 'quazor phone "
+      "probe' shows the camera's codes.");
+  EXPECT_EQ(problemOf(withMetadata("\"format\": \"UVCH\"")),
+            "F:3: cameras.BackFacingCamera.metadata.format: \"format\" requires a metadata \"node\".");
+}
+
 }  // namespace
 }  // namespace quazor

@@ -48,7 +48,7 @@ bool CameraRun::enableProjector(DiagnosticErrorPtr* error) {
     off.push_back(valueFor(*control, setting.value));
   }
   int number = 0;
-  guard_ = node_->kernel().guardControls(node_->path(), off, &number);
+  guard_ = node_->kernel().guardControls(node_->path(), node_->descriptor(), off, &number);
   if (guard_ == nullptr) {
     failSystemCall(error, "guarding the projector", node_->path(), number);
     return false;

@@ -52,6 +52,7 @@ class CameraRun final : public PolledStream, public CaptureRun {
   void watch(std::vector<pollfd>& descriptors) const override;
   std::optional<std::chrono::nanoseconds> deadline() const override;
   bool serve(std::span<const pollfd> polled) override;
+  void onPollFailed(int number) override { countFailure("poll", number); }
 
  private:
   bool enableProjector(DiagnosticErrorPtr* error);

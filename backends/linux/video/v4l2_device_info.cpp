@@ -3,6 +3,8 @@
 #include "backends/linux/system/linux_error.h"
 #include "backends/linux/video/v4l2_device.h"
 
+#include <sys/stat.h>
+
 #include <algorithm>
 #include <charconv>
 #include <fstream>
@@ -30,8 +32,23 @@ std::string firstLineOf(const std::filesystem::path& file) {
   return line;
 }
 
+NodeIdentity identityOf(const std::filesystem::path& entry) {
+  struct stat status {};
+  if (::stat(entry.c_str(), &status) != 0) return {};
+  return {status.st_ino, std::int64_t{status.st_ctim.tv_sec} * 1'000'000'000 + status.st_ctim.tv_nsec};
+}
+
+// Null if the node is not known, or was not usable.
+const V4l2DeviceInfo* knownNode(const std::vector<V4l2DeviceInfo>& known, const V4l2DeviceInfo& node) {
+  const auto isSame = [&node](const V4l2DeviceInfo& one) {
+    return one.path == node.path && one.identity == node.identity && one.problem == nullptr;
+  };
+  const auto found = std::ranges::find_if(known, isSame);
+  return found == known.end() ? nullptr : &*found;
+}
+
 void ask(const std::shared_ptr<V4l2Api>& kernel, V4l2DeviceInfo& node) {
-  const auto opened = V4l2Device::open(kernel, node.path.string(), &node.problem);
+  const auto opened = V4l2Device::inspect(kernel, node.path.string(), &node.problem);
   if (opened == nullptr) return;
   const v4l2_capability& capability = opened->capability();
   node.driver = fixedText(capability.driver);
@@ -61,7 +78,8 @@ std::vector<const V4l2DeviceInfo*> unopened(const std::vector<V4l2DeviceInfo>& n
 
 }  // namespace
 
-std::vector<V4l2DeviceInfo> videoNodes(const std::shared_ptr<V4l2Api>& kernel, const DeviceRoots& roots) {
+std::vector<V4l2DeviceInfo> videoNodes(const std::shared_ptr<V4l2Api>& kernel, const DeviceRoots& roots,
+                                       const std::vector<V4l2DeviceInfo>& known) {
   std::vector<std::pair<std::uint32_t, V4l2DeviceInfo>> numbered;
   std::error_code problem;
   std::filesystem::directory_iterator entry(roots.sysfs / "class" / "video4linux", problem);
@@ -72,7 +90,12 @@ std::vector<V4l2DeviceInfo> videoNodes(const std::shared_ptr<V4l2Api>& kernel, c
     V4l2DeviceInfo node;
     node.path = roots.dev / name;
     node.systemName = firstLineOf(entry->path() / "name");
-    ask(kernel, node);
+    node.identity = identityOf(entry->path());
+    if (const V4l2DeviceInfo* const same = knownNode(known, node)) {
+      node = *same;
+    } else {
+      ask(kernel, node);
+    }
     numbered.emplace_back(*number, std::move(node));
   }
   std::ranges::sort(numbered, {}, [](const auto& one) { return one.first; });
