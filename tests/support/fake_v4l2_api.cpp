@@ -6,6 +6,7 @@
 #include <cerrno>
 #include <cstring>
 #include <fstream>
+#include <iomanip>
 #include <utility>
 
 namespace quazor {
@@ -67,6 +68,15 @@ std::string FakeV4l2Api::add(int number, FakeNode node) {
   std::filesystem::remove_all(folder);
   std::filesystem::create_directories(folder);
   std::ofstream(folder / "name") << node.card << " node\n";
+  if (!node.device.empty()) {
+    const std::filesystem::path device = roots_.sysfs / "devices" / node.device;
+    std::filesystem::create_directories(device);
+    if (node.usbInterface) {
+      std::ofstream(device / "bInterfaceNumber")
+          << std::hex << std::setfill('0') << std::setw(2) << *node.usbInterface << "\n";
+    }
+    std::filesystem::create_directory_symlink(device, folder / "device");
+  }
   node.path = (roots_.dev / name).string();
   const std::lock_guard lock(mutex_);
   return nodes_.insert_or_assign(node.path, node).first->first;
@@ -113,7 +123,7 @@ void FakeV4l2Api::produceLocked(FakeNode& node, std::uint32_t flags) {
   if (!node.metadataNode.empty()) {
     FakeNode& metadata = nodes_.at(node.metadataNode);
     metadata.metadata = node.metadata;
-    fill(metadata, timestamp, 0);
+    fill(metadata, timestamp + node.metadataStampedAhead, 0);
   }
   changed_.notify_all();
 }

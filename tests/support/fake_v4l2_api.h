@@ -54,15 +54,18 @@ struct FakeNode {
   std::string driver = "fake";
   std::string card = "fake camera";
   std::string bus;
+  std::string device;                         // its folder below /sys/devices; empty: none
+  std::optional<std::uint32_t> usbInterface;  // of that device
   std::uint32_t capabilities = V4L2_CAP_VIDEO_CAPTURE | V4L2_CAP_STREAMING;
   std::vector<FakeFormat> formats;
   std::vector<FakeControl> controls;
   std::uint32_t mostBuffers = 32;
   std::uint32_t timestampFlags = V4L2_BUF_FLAG_TIMESTAMP_MONOTONIC;
   std::uint32_t firstSequence = 0;
-  std::chrono::nanoseconds stampedAhead{0};  // the difference between a frame's time stamp and its delivery
-  std::string metadataNode;                  // its path: receives a buffer with each frame of this node
-  std::vector<std::uint8_t> metadata;        // the content of that buffer
+  std::chrono::nanoseconds stampedAhead{0};          // the difference between a frame's time stamp and its delivery
+  std::chrono::nanoseconds metadataStampedAhead{0};  // the same for its metadata, relative to the frame
+  std::string metadataNode;                          // its path: receives a buffer with each frame of this node
+  std::vector<std::uint8_t> metadata;                // the content of that buffer
   bool delivers = true;
   int openProblem = 0;  // an error number
   v4l2_meta_format metadataFormat{v4l2_fourcc('F', 'A', 'K', 'E'), 64};

@@ -32,6 +32,23 @@ std::string firstLineOf(const std::filesystem::path& file) {
   return line;
 }
 
+// As on the running system, whatever the folder of sysfs is.
+std::string deviceOf(const std::filesystem::path& entry, const std::filesystem::path& sysfs) {
+  std::error_code problem;
+  const std::filesystem::path device = std::filesystem::canonical(entry / "device", problem);
+  if (problem) return {};
+  return (std::filesystem::path("/sys") / device.lexically_relative(std::filesystem::canonical(sysfs, problem)))
+      .string();
+}
+
+std::optional<std::uint32_t> usbInterfaceOf(const std::filesystem::path& entry) {
+  const std::string line = firstLineOf(entry / "device" / "bInterfaceNumber");
+  std::uint32_t number = 0;
+  const auto [end, problem] = std::from_chars(line.data(), line.data() + line.size(), number, 16);
+  if (problem != std::errc() || end != line.data() + line.size()) return std::nullopt;
+  return number;
+}
+
 NodeIdentity identityOf(const std::filesystem::path& entry) {
   struct stat status {};
   if (::stat(entry.c_str(), &status) != 0) return {};
@@ -58,7 +75,10 @@ void ask(const std::shared_ptr<V4l2Api>& kernel, V4l2DeviceInfo& node) {
   node.kind = opened->kind();
 }
 
-bool fits(const std::optional<std::string>& wanted, const std::string& text) { return !wanted || *wanted == text; }
+template <class Wanted, class Found>
+bool fits(const std::optional<Wanted>& wanted, const Found& found) {
+  return !wanted || found == *wanted;
+}
 
 std::string_view nameOf(VideoNodeKind kind) { return kind == VideoNodeKind::kMetadata ? "metadata node" : "camera"; }
 
@@ -90,6 +110,8 @@ std::vector<V4l2DeviceInfo> videoNodes(const std::shared_ptr<V4l2Api>& kernel, c
     V4l2DeviceInfo node;
     node.path = roots.dev / name;
     node.systemName = firstLineOf(entry->path() / "name");
+    node.device = deviceOf(entry->path(), roots.sysfs);
+    node.usbInterface = usbInterfaceOf(entry->path());
     node.identity = identityOf(entry->path());
     if (const V4l2DeviceInfo* const same = knownNode(known, node)) {
       node = *same;
@@ -114,7 +136,8 @@ std::optional<VideoNodeDetails> detailsOf(const std::shared_ptr<V4l2Api>& kernel
 
 bool matches(const V4l2DeviceInfo& node, const VideoNodeMatch& match) {
   return node.problem == nullptr && fits(match.driver, node.driver) && fits(match.card, node.card) &&
-         fits(match.busInfo, node.busInfo);
+         fits(match.busInfo, node.busInfo) && fits(match.usbInterface, node.usbInterface) &&
+         fits(match.path, node.device);
 }
 
 std::optional<V4l2DeviceInfo> findVideoNode(const std::vector<V4l2DeviceInfo>& nodes, VideoNodeKind kind,
@@ -148,7 +171,8 @@ std::optional<V4l2DeviceInfo> findVideoNode(const std::vector<V4l2DeviceInfo>& n
 
 std::string textOf(const V4l2DeviceInfo& node) {
   if (node.problem != nullptr) return node.path.string() + " (" + node.problem->localizedDescription() + ")";
-  return node.path.string() + " (driver " + node.driver + ", card " + node.card + ", bus " + node.busInfo + ")";
+  return node.path.string() + " (driver " + node.driver + ", card " + node.card + ", bus " + node.busInfo +
+         (node.usbInterface ? ", USB interface " + std::to_string(*node.usbInterface) : "") + ")";
 }
 
 std::string textOf(const VideoNodeMatch& match) {
@@ -162,6 +186,8 @@ std::string textOf(const VideoNodeMatch& match) {
   add("driver", match.driver);
   add("card", match.card);
   add("bus", match.busInfo);
+  if (match.usbInterface) add("USB interface", std::to_string(*match.usbInterface));
+  add("path", match.path);
   return text.empty() ? "any" : text;
 }
 

@@ -61,6 +61,8 @@ struct V4l2DeviceInfo {
   NodeIdentity identity;
   std::filesystem::path path;  // for example /dev/video0
   std::string systemName;      // the name in sysfs, for example "vivid-000-vid-cap"
+  std::string device;          // the path in sysfs of the device it is part of, "/sys/devices/..."; empty if unknown
+  std::optional<std::uint32_t> usbInterface;  // the number of that device if it is a USB interface
   // The members below are empty if the node cannot be opened; `problem` then gives the reason.
   std::string driver;
   std::string card;
