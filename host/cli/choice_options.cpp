@@ -1,16 +1,20 @@
 #include "host/cli/choice_options.h"
 
 #include "base/text/utf8.h"
+#include "host/cli/option_values.h"
 #include "host/error/exit_code.h"
 #include "host/run/deadlines.h"
 
 #include <CLI/CLI.hpp>
 
 #include <cstddef>
+#include <cstdint>
 
 namespace quazor {
 
 namespace {
+
+constexpr std::uint64_t kMaxTrials = 1000;
 
 SkipRule parseSkip(const std::string& text) {
   const auto refuse = [&text](const std::string& why) {
@@ -49,6 +53,18 @@ void addChoiceOptions(CLI::App& command, ChoiceTexts& texts, const std::string& 
                   "Wait this long between two " + what +
                       ". A simulated phone waits in its own time, which costs none, unless --realtime is given")
       ->type_name("SECONDS");
+  command
+      .add_option("--attempts", texts.attempts,
+                  "Run one of the " + what +
+                      " that ends in an error again, until it has no error or this many attempts are made; a failure "
+                      "is final")
+      ->type_name("N");
+  command.add_flag("--accept-flaky", texts.acceptFlaky,
+                   "With --attempts: exit with 0 if some of the " + what + " passed only after an error");
+  command
+      .add_option("--repeat", texts.repetitions,
+                  "Run all selected " + what + " this many times, one round after the other, and show what varied")
+      ->type_name("N");
 }
 
 Choice choiceOf(const ChoiceTexts& texts) {
@@ -58,6 +74,13 @@ Choice choiceOf(const ChoiceTexts& texts) {
   for (const std::string& text : texts.skips) choice.skips.push_back(parseSkip(text));
   if (!texts.stopOn.empty()) choice.stopOn = texts.stopOn == "fail" ? StopOn::kFail : StopOn::kError;
   choice.allowSkips = texts.allowSkips;
+  if (!texts.attempts.empty()) choice.attempts = parseWhole("--attempts", texts.attempts, 1, kMaxTrials);
+  if (!texts.repetitions.empty()) choice.repetitions = parseWhole("--repeat", texts.repetitions, 1, kMaxTrials);
+  choice.acceptFlaky = texts.acceptFlaky;
+  if (texts.acceptFlaky && texts.attempts.empty()) {
+    throw CommandError(ExitCode::kUsage,
+                       "--accept-flaky requires --attempts: without a second attempt nothing passes after an error");
+  }
   return choice;
 }
 

@@ -1,9 +1,10 @@
-// The options that choose which diagnostics run, what is skipped, and when a run stops.
+// The options that choose which diagnostics run and how often, what is skipped, and when a run stops.
 #pragma once
 
 #include "host/device/skip.h"
 
 #include <chrono>
+#include <cstdint>
 #include <string>
 #include <vector>
 
@@ -22,6 +23,9 @@ struct Choice {
   std::chrono::nanoseconds settle{};  // between two diagnostics
   StopOn stopOn = StopOn::kNothing;
   bool allowSkips = false;
+  std::uint64_t attempts = 1;     // of a diagnostic that ends in an error
+  std::uint64_t repetitions = 1;  // of the run
+  bool acceptFlaky = false;       // a pass after an error
 };
 
 // The arguments, before they are checked.
@@ -30,7 +34,10 @@ struct ChoiceTexts {
   std::vector<std::string> skips;
   std::string settle;
   std::string stopOn;
+  std::string attempts;
+  std::string repetitions;
   bool allowSkips = false;
+  bool acceptFlaky = false;
 };
 
 // Declares the options of a command that runs diagnostics or experiments.

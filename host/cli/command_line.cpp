@@ -89,8 +89,9 @@ void removeMarks(RawOptions& raw) {
         &raw.outputs, &raw.deadlines, &raw.choice.except, &raw.choice.skips}) {
     std::for_each(texts->begin(), texts->end(), removeMark);
   }
-  for (std::string* text : {&raw.profile, &raw.phone, &raw.record, &raw.of, &raw.seed, &raw.seeds, &raw.memory,
-                            &raw.logLimit, &raw.grace, &raw.choice.settle}) {
+  for (std::string* text :
+       {&raw.profile, &raw.phone, &raw.record, &raw.of, &raw.seed, &raw.seeds, &raw.memory, &raw.logLimit, &raw.grace,
+        &raw.choice.settle, &raw.choice.attempts, &raw.choice.repetitions}) {
     removeMark(*text);
   }
 }
@@ -278,8 +279,9 @@ void checkNames(const Options& options, const std::string& what) {
 }
 
 Options optionsOf(const CLI::App& command, const RawOptions& raw) {
-  for (const char* option : {"--plugin", "--output", "--profile", "--parameters", "--phone", "--record", "--of",
-                             "RECORD", "--memory", "--log-limit", "--grace", "--settle", "--except", "--skip"}) {
+  for (const char* option :
+       {"--plugin", "--output", "--profile", "--parameters", "--phone", "--record", "--of", "RECORD", "--memory",
+        "--log-limit", "--grace", "--settle", "--except", "--skip", "--attempts", "--repeat"}) {
     refuseEmpty(command, option);
   }
   Options options;

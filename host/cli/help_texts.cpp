@@ -26,6 +26,7 @@ constexpr Example kExamples[] = {
     {"quazor run --all --phone linux:board.json", "run on this machine's own cameras, sensors and counters"},
     {"quazor run --all --limit '*.Total >= 90'", "also judge by a limit of your own"},
     {"quazor run --all --record records/ --tag serial=C02X --output junit:report.xml"},
+    {"quazor run --all --repeat 100", "run everything 100 times and show what varied"},
     {"quazor run --only failed", "rerun the diagnostics that did not pass last time"},
     {"quazor experiment CameraSyncExperiment.Back", "measure without judging"},
     {"quazor verify run.jsonl", "check that the recorded verdicts follow from the data"},

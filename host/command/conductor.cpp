@@ -1,5 +1,6 @@
 #include "host/command/conductor.h"
 
+#include "host/model/trials.h"
 #include "host/text/timestamp.h"
 
 #include <chrono>
@@ -8,23 +9,48 @@
 
 namespace quazor {
 
-std::optional<std::string> Conductor::performAll(const std::vector<Job>& jobs, StopOn stopOn,
-                                                 std::chrono::nanoseconds settle) {
-  std::optional<Skip> stopped;
-  bool hasRun = false;
-  for (const Job& job : jobs) {
-    if (stopped || job.skip) {
-      skip(job, stopped ? *stopped : *job.skip);
-      continue;
-    }
-    if (std::exchange(hasRun, true) && settle.count() > 0) {
-      this->settle(settle);
-      if (isInterrupted()) return "";
-    }
-    if (std::optional<std::string> interrupted = perform(job)) return interrupted;
-    stopped = stopAfterLast(stopOn);
+std::optional<std::string> Conductor::performAll(const std::vector<Job>& jobs, const Plan& plan) {
+  for (std::uint64_t repetition = 1; repetition <= plan.repetitions; ++repetition) {
+    if (std::optional<std::string> interrupted = performRound(jobs, plan, repetition)) return interrupted;
   }
   return std::nullopt;
+}
+
+std::optional<std::string> Conductor::performRound(const std::vector<Job>& jobs, const Plan& plan,
+                                                   std::uint64_t repetition) {
+  for (const Job& one : jobs) {
+    Job job = one;
+    if (plan.repetitions > 1) job.repetition = repetition;
+    if (plan.attempts > 1) job.attempt = 1;
+    if (stopped_ || job.skip) {
+      job.seed = seedOf(one.seed, job.repetition, 1);
+      skip(job, stopped_ ? *stopped_ : *job.skip);
+      continue;
+    }
+    if (std::optional<std::string> interrupted = performAttempts(std::move(job), plan)) return interrupted;
+    stopped_ = stopAfterLast(plan.stopOn);
+  }
+  return std::nullopt;
+}
+
+std::optional<std::string> Conductor::performAttempts(Job job, const Plan& plan) {
+  const std::uint64_t seed = job.seed;
+  for (std::uint64_t attempt = 1; attempt <= plan.attempts; ++attempt) {
+    settleBefore(plan);
+    if (isInterrupted()) return "";
+    if (plan.attempts > 1) job.attempt = attempt;
+    if (plan.phones) {
+      job.seed = seedOf(seed, job.repetition, attempt);
+      runOptions_.makePhone = plan.phones(job.seed);
+    }
+    if (std::optional<std::string> interrupted = perform(job)) return interrupted;
+    if (!mayTryAgain(events_.records().back())) break;
+  }
+  return std::nullopt;
+}
+
+void Conductor::settleBefore(const Plan& plan) {
+  if (std::exchange(hasRun_, true) && plan.settle.count() > 0) settle(plan.settle);
 }
 
 std::optional<std::string> Conductor::perform(const Job& job) {
@@ -59,7 +85,7 @@ void Conductor::begin(const Job& job) {
   const Diagnostic& diagnostic = job.bound.described.diagnostic;
   events_.onEvent(DiagnosticStarted{diagnostic.name, job.bound.described.summary(), diagnostic.experimentName,
                                     diagnostic.analysisName, diagnostic.experimentOnly, job.bound.parameters, job.seed,
-                                    dateNow()});
+                                    dateNow(), job.attempt, job.repetition});
 }
 
 void Conductor::skip(const Job& job, const Skip& skip) {

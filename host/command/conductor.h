@@ -22,6 +22,18 @@ struct Job {
   std::uint64_t seed = 0;
   std::optional<Skip> skip{};    // why it is not run
   DiagnosticErrorPtr problem{};  // why it cannot be run
+  // Of the recorded entry that is analyzed again; 0 otherwise.
+  std::uint64_t attempt = 0;
+  std::uint64_t repetition = 0;
+};
+
+// How the jobs of a run follow each other.
+struct Plan {
+  StopOn stopOn = StopOn::kNothing;
+  std::chrono::nanoseconds settle{};  // the real time to wait between two jobs
+  std::uint64_t attempts = 1;         // of a job that ends in an error, at most
+  std::uint64_t repetitions = 1;      // of all jobs, one round after the other
+  SeededPhoneMaker phones{};          // of the attempts; empty: all use the phone of the run
 };
 
 // Performs jobs in order, each in a separate process or all in this one.
@@ -34,24 +46,29 @@ class Conductor {
 
   bool isInterrupted() const { return signals_ != nullptr && signals_->requestsToEnd() > 0; }
 
-  // `settle` is the real time to wait between two jobs. Returns the diagnostic that the user interrupted, as in
-  // RunEnded; nothing if the run continues.
-  std::optional<std::string> performAll(const std::vector<Job>& jobs, StopOn stopOn, std::chrono::nanoseconds settle);
+  // Returns the diagnostic that the user interrupted, as in RunEnded; nothing if the run continues.
+  std::optional<std::string> performAll(const std::vector<Job>& jobs, const Plan& plan);
 
  private:
+  std::optional<std::string> performRound(const std::vector<Job>& jobs, const Plan& plan, std::uint64_t repetition);
+  std::optional<std::string> performAttempts(Job job, const Plan& plan);
   std::optional<std::string> perform(const Job& job);
   void performHere(const Job& job);
   void begin(const Job& job);
   void skip(const Job& job, const Skip& skip);
+  // Waits before every job but the first.
+  void settleBefore(const Plan& plan);
   // Waits, or until the user interrupts.
   void settle(std::chrono::nanoseconds time) const;
   // Why the run stops after the diagnostic that has just ended; nothing if it goes on.
   std::optional<Skip> stopAfterLast(StopOn stopOn) const;
 
   const IsolationOptions isolation_;
-  const RunOptions runOptions_;
+  RunOptions runOptions_;  // the phone is that of the attempt
   WatchedSignals* const signals_;
   EventPipeline& events_;
+  std::optional<Skip> stopped_;
+  bool hasRun_ = false;
 };
 
 }  // namespace quazor

@@ -43,6 +43,9 @@ Profile recordedProfile(const std::filesystem::path& record, const RecordedRun& 
   profile.mayNameOthers = true;
   for (const DiagnosticRecord& one : run.records) {
     if (std::find(names.begin(), names.end(), one.name) == names.end()) continue;
+    const bool isKnown = std::any_of(profile.entries.begin(), profile.entries.end(),
+                                     [&one](const ProfileEntry& known) { return known.name == one.name; });
+    if (isKnown) continue;  // another attempt or repetition has the same parameters
     profile.entries.push_back({one.name, valuesOf(one.parameters.experiment), valuesOf(one.parameters.analysis)});
   }
   return profile;

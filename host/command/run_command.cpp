@@ -9,6 +9,7 @@
 #include "host/device/phone.h"
 #include "host/error/host_error.h"
 #include "host/model/limit_check.h"
+#include "host/model/trials.h"
 #include "host/record/record_place.h"
 #include "host/run/event_pipeline.h"
 #include "host/run/isolation.h"
@@ -53,6 +54,9 @@ RunStarted beginningOf(const Options& options, const Installation& installation,
   began.id = randomIdentifier();
   began.host = nameOfThisMachine();
   began.tags = options.tags;
+  if (options.choice.attempts > 1) began.attempts = options.choice.attempts;
+  if (options.choice.repetitions > 1) began.repetitions = options.choice.repetitions;
+  began.acceptFlaky = options.choice.acceptFlaky;
   began.ofExperiments = options.command == Command::kExperiment;
   for (const FailedPlugin& plugin : failed) began.names.push_back(plugin.file.filename().string());
   for (const Job& job : jobs) began.names.push_back(job.bound.described.diagnostic.name);
@@ -86,7 +90,7 @@ std::chrono::nanoseconds realSettleOf(const Options& options) {
 
 ExitCode perform(const Options& options, const Installation& installation, Console& console, RunStarted began,
                  const std::vector<Job>& jobs, const std::vector<FailedPlugin>& failed, const RunOptions& runOptions,
-                 WatchedSignals* signals) {
+                 const SeededPhoneMaker& phones, WatchedSignals* signals) {
   const auto pipeline = beginEvents(options, installation, began, options.command == Command::kRun, console);
   EventPipeline& events = *pipeline;
   std::optional<InterruptWatcher> watcher;
@@ -94,6 +98,7 @@ ExitCode perform(const Options& options, const Installation& installation, Conso
     watcher.emplace([&events] { events.interruptAndLeave([] { ::_exit(static_cast<int>(ExitCode::kInterrupted)); }); });
   }
   const std::vector<UserLimit> limits = began.limits;
+  const bool acceptFlaky = began.acceptFlaky;
   Conductor conductor(withoutFailed(isolationOf(options, installation), failed), runOptions, signals, events);
   events.onEvent(std::move(began));
   for (const FailedPlugin& plugin : failed) tellFailedPlugin(plugin, events);
@@ -101,13 +106,16 @@ ExitCode perform(const Options& options, const Installation& installation, Conso
     events.onEvent(RunEnded{"", dateNow()});
     return ExitCode::kInterrupted;
   }
-  const std::chrono::nanoseconds settle = realSettleOf(options);
-  if (std::optional<std::string> interrupted = conductor.performAll(jobs, options.choice.stopOn, settle)) {
+  const Choice& choice = options.choice;
+  const Plan plan{choice.stopOn, realSettleOf(options), choice.attempts, choice.repetitions, phones};
+  if (std::optional<std::string> interrupted = conductor.performAll(jobs, plan)) {
     events.onEvent(RunEnded{std::move(interrupted), dateNow()});
     return ExitCode::kInterrupted;
   }
   for (const UserLimit& limit : limitsWithoutResult(limits, events.records())) tellLimitWithoutResult(limit, events);
-  events.onEvent(RunEnded{std::nullopt, dateNow()});
+  RunEnded ended{std::nullopt, dateNow()};
+  if (hasTrials(events.records())) ended.verdict = runVerdictOf(events.records(), acceptFlaky);
+  events.onEvent(ended);
   events.requireRecords();
   return events.exitCode();
 }
@@ -161,19 +169,20 @@ DiagnosticErrorPtr missingParameter(const ResolvedDiagnostic& one, const Options
 // The selected phone.
 struct ChosenPhone {
   std::string name;  // as records have it
-  PhoneMaker make;
+  SeededPhoneMaker make;
   std::vector<SkipRule> absent;
 };
 
 ChosenPhone choosePhone(const Options& options, const Installation& installation) {
   if (const auto binding = bindingNamed(options.phone)) {
     const std::filesystem::path file = installation.binding(*binding);
-    return {std::string(kLinuxPrefix) + file.string(), phonesOfBinding(file), absentOnBinding(file)};
+    const auto make = [phones = phonesOfBinding(file)](std::uint64_t /*seed*/) { return phones; };
+    return {std::string(kLinuxPrefix) + file.string(), make, absentOnBinding(file)};
   }
   const std::filesystem::path scenario =
       options.phone.empty() ? installation.defaultScenario() : installation.scenario(options.phone);
   const ScenarioSource source = installation.scenarioSource();
-  return {scenario.string(), phonesOfScenario(scenario, options.realTime, options.seed, source),
+  return {scenario.string(), seededPhonesOfScenario(scenario, options.realTime, source),
           absentOnScenario(scenario, source)};
 }
 
@@ -192,13 +201,13 @@ ExitCode runCommand(const Options& given, const Installation& installation, Cons
     jobs.push_back({std::move(one), nullptr, options.seed, std::move(skip), std::move(problem)});
   }
   RunOptions runOptions;
-  runOptions.makePhone = phone.make;
   runOptions.logLevel = options.logLevel.value_or(LogLevel::kDefault);
   runOptions.logLimit = options.logLimit;
   RunStarted began = beginningOf(options, installation, jobs, selection.failed);
   began.phone = phone.name;
   began.limits = std::move(selection.limits);
-  return perform(options, installation, console, std::move(began), jobs, selection.failed, runOptions, signals);
+  return perform(options, installation, console, std::move(began), jobs, selection.failed, runOptions, phone.make,
+                 signals);
 }
 
 namespace {
@@ -257,6 +266,8 @@ ExitCode analyzeCommand(const Options& given, const Installation& installation, 
       results[i].measurements() = record.measurements;
       results[i].auxiliaryData() = record.auxiliaryData;
       jobs.push_back({{one.described, reboundParameters(record, one)}, &results[i], record.seed});
+      jobs.back().attempt = record.trial.attempt;
+      jobs.back().repetition = record.trial.repetition;
     }
   }
   RunOptions runOptions;
@@ -265,8 +276,10 @@ ExitCode analyzeCommand(const Options& given, const Installation& installation, 
   RunStarted began = beginningOf(options, installation, jobs, selection.failed);
   began.phone = run.began.phone;
   began.seed = run.began.seed;
+  began.acceptFlaky = run.began.acceptFlaky;
   began.limits = selection.limits.empty() ? run.began.limits : selection.limits;
-  return perform(options, installation, console, std::move(began), jobs, selection.failed, runOptions, signals);
+  return perform(options, installation, console, std::move(began), jobs, selection.failed, runOptions, nullptr,
+                 signals);
 }
 
 }  // namespace quazor

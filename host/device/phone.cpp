@@ -89,13 +89,18 @@ BindingFile readBindingFile(const std::filesystem::path& file) {
 
 }  // namespace
 
-PhoneMaker phonesOfScenario(const std::filesystem::path& file, bool realTime, std::uint64_t seed,
-                            const ScenarioSource& find) {
+SeededPhoneMaker seededPhonesOfScenario(const std::filesystem::path& file, bool realTime, const ScenarioSource& find) {
   const PhoneTime time = realTime ? PhoneTime::kReal : PhoneTime::kVirtual;
   const auto readIt = [&find](const std::filesystem::path& one) { return readScenarioFile(one, find); };
-  return [scenario = read(readIt, file).scenario, time, seed] {
-    return std::make_unique<PhoneOfScenario>(scenario, time, seed);
+  const auto scenario = std::make_shared<const Scenario>(read(readIt, file).scenario);
+  return [scenario, time](std::uint64_t seed) {
+    return [scenario, time, seed] { return std::make_unique<PhoneOfScenario>(*scenario, time, seed); };
   };
+}
+
+PhoneMaker phonesOfScenario(const std::filesystem::path& file, bool realTime, std::uint64_t seed,
+                            const ScenarioSource& find) {
+  return seededPhonesOfScenario(file, realTime, find)(seed);
 }
 
 std::optional<std::filesystem::path> bindingNamed(const std::filesystem::path& phone) {

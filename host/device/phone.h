@@ -43,6 +43,9 @@ class Phone {
 // Creates a new phone on every call, all in the same initial state.
 using PhoneMaker = std::function<std::unique_ptr<Phone>()>;
 
+// Returns a factory of phones whose course of events that seed determines.
+using SeededPhoneMaker = std::function<PhoneMaker(std::uint64_t seed)>;
+
 // Finds the file of a scenario that another one is based on by its name; empty if there is none.
 using ScenarioSource = std::function<std::filesystem::path(const std::filesystem::path& name)>;
 
@@ -51,6 +54,10 @@ using ScenarioSource = std::function<std::filesystem::path(const std::filesystem
 // if the file cannot be read.
 PhoneMaker phonesOfScenario(const std::filesystem::path& file, bool realTime, std::uint64_t seed,
                             const ScenarioSource& find = nullptr);
+
+// Like phonesOfScenario, for any number of seeds. The file is read once.
+SeededPhoneMaker seededPhonesOfScenario(const std::filesystem::path& file, bool realTime,
+                                        const ScenarioSource& find = nullptr);
 
 // What the phone of a scenario or binding file cannot run. Throws like phonesOfScenario.
 std::vector<SkipRule> absentOnScenario(const std::filesystem::path& file, const ScenarioSource& find = nullptr);

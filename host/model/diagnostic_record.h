@@ -32,6 +32,15 @@ struct StagePeriod {
   std::optional<Date> end;  // nothing when it did not end
 };
 
+// Which run of a diagnostic an entry is, if the run has several. 0 means that the run does not try again or repeat, or
+// that it is not known how often it may.
+struct Trial {
+  std::uint64_t attempt = 0;   // from 1
+  std::uint64_t attempts = 0;  // at most
+  std::uint64_t repetition = 0;
+  std::uint64_t repetitions = 0;
+};
+
 // An experiment on its own is not judged: it has no measured results, and kPass means that it returned a result.
 struct DiagnosticRecord {
   bool experimentOnly = false;
@@ -51,6 +60,7 @@ struct DiagnosticRecord {
   std::vector<LogLine> log;
   std::vector<DeclaredFault> faults;
   std::uint64_t seed = 0;
+  Trial trial;
   StageDurations durations;
   std::vector<StagePeriod> stages;
   Date begin{};  // by the wall clock, as is `end`

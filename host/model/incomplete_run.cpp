@@ -2,9 +2,11 @@
 
 #include "host/error/host_error.h"
 
+#include <algorithm>
 #include <cstddef>
 #include <cstdint>
 #include <map>
+#include <utility>
 
 namespace quazor {
 
@@ -17,23 +19,37 @@ bool saysItWasInterrupted(const DiagnosticRecord& record) {
 
 }  // namespace
 
+std::vector<PlannedDiagnostic> missingOf(const RunStarted& run, const std::vector<DiagnosticRecord>& records) {
+  std::map<std::pair<std::string, std::uint64_t>, std::size_t> begun;
+  for (const DiagnosticRecord& record : records) {
+    const bool isTriedAgain = run.attempts > 0 && record.trial.attempt > 1;
+    if (!isTriedAgain) ++begun[{record.name, run.repetitions > 0 ? record.trial.repetition : 0}];
+  }
+  std::vector<PlannedDiagnostic> missing;
+  for (std::uint64_t repetition = run.repetitions == 0 ? 0 : 1; repetition <= run.repetitions; ++repetition) {
+    for (const std::string& name : run.names) {
+      // What could not be loaded is not repeated.
+      if (repetition > 0 && begun.contains({name, 0})) continue;
+      std::size_t& left = begun[{name, repetition}];
+      if (left == 0) {
+        missing.push_back({name, repetition});
+      } else {
+        --left;
+      }
+    }
+  }
+  return missing;
+}
+
 UnrecordedDiagnostics unrecordedDiagnosticsOf(const RunStarted& run, const std::vector<DiagnosticRecord>& records,
                                               const std::optional<std::string>& interrupted) {
   UnrecordedDiagnostics unrecorded;
-  std::map<std::string, std::size_t> begun;
-  for (const DiagnosticRecord& record : records) ++begun[record.name];
-  if (interrupted && (records.empty() || !saysItWasInterrupted(records.back()))) {
-    unrecorded.interrupted = *interrupted;
-    ++begun[*interrupted];
-  }
-  for (const std::string& name : run.names) {
-    std::size_t& left = begun[name];
-    if (left == 0) {
-      unrecorded.neverRun.push_back(name);
-    } else {
-      --left;
-    }
-  }
+  unrecorded.neverRun = missingOf(run, records);
+  if (!interrupted || (!records.empty() && saysItWasInterrupted(records.back()))) return unrecorded;
+  unrecorded.interrupted = *interrupted;
+  const auto running = std::find_if(unrecorded.neverRun.begin(), unrecorded.neverRun.end(),
+                                    [&interrupted](const PlannedDiagnostic& one) { return one.name == *interrupted; });
+  if (running != unrecorded.neverRun.end()) unrecorded.neverRun.erase(running);
   return unrecorded;
 }
 

@@ -3,18 +3,28 @@
 
 #include "host/model/run_event.h"
 
+#include <cstdint>
 #include <optional>
 #include <string>
 #include <vector>
 
 namespace quazor {
 
+// A diagnostic of the plan. The repetition is 0 if the run does not repeat.
+struct PlannedDiagnostic {
+  std::string name;
+  std::uint64_t repetition = 0;
+};
+
 struct UnrecordedDiagnostics {
   // The diagnostic that was running at the interruption, unless its record already says so. Empty text: none was
   // running.
   std::optional<std::string> interrupted;
-  std::vector<std::string> neverRun;  // in the planned order
+  std::vector<PlannedDiagnostic> neverRun;  // in the planned order
 };
+
+// The planned diagnostics of which no entry exists.
+std::vector<PlannedDiagnostic> missingOf(const RunStarted& run, const std::vector<DiagnosticRecord>& records);
 
 // `interrupted` as in RunEnded.
 UnrecordedDiagnostics unrecordedDiagnosticsOf(const RunStarted& run, const std::vector<DiagnosticRecord>& records,

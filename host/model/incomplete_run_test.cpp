@@ -17,25 +17,33 @@ RunStarted runOf(std::vector<std::string> names) {
   return run;
 }
 
+std::vector<std::string> namesOf(const std::vector<PlannedDiagnostic>& planned) {
+  std::vector<std::string> names;
+  for (const auto& [name, repetition] : planned) {
+    names.push_back(repetition == 0 ? name : name + " " + std::to_string(repetition));
+  }
+  return names;
+}
+
 TEST(UnrecordedDiagnostics, AreNoneWhenAllHaveRecords) {
   const UnrecordedDiagnostics unrecorded =
       unrecordedDiagnosticsOf(runOf({"A", "B"}), {recordOf("A", Verdict::kPass), recordOf("B", Verdict::kError)}, {});
   EXPECT_EQ(unrecorded.interrupted, std::nullopt);
-  EXPECT_THAT(unrecorded.neverRun, testing::IsEmpty());
+  EXPECT_THAT(namesOf(unrecorded.neverRun), testing::IsEmpty());
 }
 
 TEST(UnrecordedDiagnostics, AreTheInterruptedOneAndThoseAfterIt) {
   const UnrecordedDiagnostics unrecorded =
       unrecordedDiagnosticsOf(runOf({"A", "B", "C", "D"}), {recordOf("A", Verdict::kPass)}, "B");
   EXPECT_EQ(unrecorded.interrupted, "B");
-  EXPECT_THAT(unrecorded.neverRun, ElementsAre("C", "D"));
+  EXPECT_THAT(namesOf(unrecorded.neverRun), ElementsAre("C", "D"));
 }
 
 TEST(UnrecordedDiagnostics, HaveAnEmptyNameForAnInterruptBetweenTwo) {
   const UnrecordedDiagnostics unrecorded =
       unrecordedDiagnosticsOf(runOf({"A", "B"}), {recordOf("A", Verdict::kPass)}, "");
   EXPECT_EQ(unrecorded.interrupted, "");
-  EXPECT_THAT(unrecorded.neverRun, ElementsAre("B"));
+  EXPECT_THAT(namesOf(unrecorded.neverRun), ElementsAre("B"));
   EXPECT_EQ(unrecordedDiagnosticsOf(runOf({"A"}), {}, "").interrupted, "");
 }
 
@@ -45,7 +53,7 @@ TEST(UnrecordedDiagnostics, LeaveOutAnInterruptedOneWhoseRecordSaysSo) {
   const UnrecordedDiagnostics unrecorded =
       unrecordedDiagnosticsOf(runOf({"A", "B", "C"}), {recordOf("A", Verdict::kPass), record}, "B");
   EXPECT_EQ(unrecorded.interrupted, std::nullopt);
-  EXPECT_THAT(unrecorded.neverRun, ElementsAre("C"));
+  EXPECT_THAT(namesOf(unrecorded.neverRun), ElementsAre("C"));
 }
 
 TEST(UnrecordedDiagnostics, HaveAnInterruptedOneWhoseRecordTellsOfAnotherError) {
@@ -60,7 +68,29 @@ TEST(UnrecordedDiagnostics, HaveAnInterruptedOneWhoseRecordTellsOfAnotherError) 
 TEST(UnrecordedDiagnostics, CountEveryRunOfADiagnostic) {
   const UnrecordedDiagnostics unrecorded =
       unrecordedDiagnosticsOf(runOf({"A", "A", "A", "A"}), {recordOf("A", Verdict::kPass)}, "A");
-  EXPECT_THAT(unrecorded.neverRun, ElementsAre("A", "A"));
+  EXPECT_THAT(namesOf(unrecorded.neverRun), ElementsAre("A", "A"));
+}
+
+TEST(UnrecordedDiagnostics, HaveARepetitionEach) {
+  RunStarted run = runOf({"broken.so", "A", "B"});
+  run.repetitions = 2;
+  run.attempts = 2;
+  std::vector<DiagnosticRecord> records = {recordOf("broken.so", Verdict::kError)};  // what is no diagnostic runs once
+  const auto add = [&records](const std::string& name, Verdict verdict, std::uint64_t repetition,
+                              std::uint64_t attempt) {
+    records.push_back(recordOf(name, verdict));
+    records.back().trial = {attempt, 2, repetition, 2};
+  };
+  add("A", Verdict::kError, 1, 1);
+  add("A", Verdict::kPass, 1, 2);
+  EXPECT_THAT(namesOf(missingOf(run, records)), ElementsAre("B 1", "A 2", "B 2"));
+  const UnrecordedDiagnostics unrecorded = unrecordedDiagnosticsOf(run, records, "B");
+  EXPECT_EQ(unrecorded.interrupted, "B");
+  EXPECT_THAT(namesOf(unrecorded.neverRun), ElementsAre("A 2", "B 2"));
+  add("B", Verdict::kPass, 1, 1);
+  add("A", Verdict::kPass, 2, 1);
+  add("B", Verdict::kPass, 2, 1);
+  EXPECT_THAT(namesOf(missingOf(run, records)), testing::IsEmpty());
 }
 
 TEST(Interruption, IsTheHostsError) {

@@ -25,7 +25,11 @@ std::vector<RunEvent> RecordBuilder::ending(Date date) const {
   return events;
 }
 
-void RecordBuilder::fold(const RunStarted& event) { limits_ = event.limits; }
+void RecordBuilder::fold(const RunStarted& event) {
+  limits_ = event.limits;
+  attempts_ = event.attempts;
+  repetitions_ = event.repetitions;
+}
 
 void RecordBuilder::fold(const DiagnosticStarted& event) {
   record_ = DiagnosticRecord();
@@ -37,6 +41,7 @@ void RecordBuilder::fold(const DiagnosticStarted& event) {
   record_.parameters = event.parameters;
   record_.limits = limitsFor(event.name, limits_);
   record_.seed = event.seed;
+  record_.trial = {event.attempt, attempts_, event.repetition, repetitions_};
   record_.begin = event.date;
   record_.end = event.date;
   open_ = true;

@@ -3,6 +3,7 @@
 
 #include "host/model/run_event.h"
 
+#include <cstdint>
 #include <optional>
 #include <vector>
 
@@ -47,6 +48,8 @@ class RecordBuilder final : public RunEventSink {
   void fold(const RunEnded& event);
 
   std::vector<UserLimit> limits_;  // of the run
+  std::uint64_t attempts_ = 0;     // as in RunStarted
+  std::uint64_t repetitions_ = 0;
   DiagnosticRecord record_;
   bool open_ = false;
   bool completed_ = false;

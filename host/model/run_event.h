@@ -28,6 +28,11 @@ struct RunStarted {
   std::string id{};                // random: 128 bits in hexadecimal; empty in records of format 1
   std::string host{};              // the name of the machine; empty in records of format 1
   OrderedMap<std::string> tags{};  // of the user, for example serial=C02X
+  // How often a diagnostic is tried, at most, and how often all are run; 0 without these options, also for the analysis
+  // of a record, whose entries keep their numbers.
+  std::uint64_t attempts = 0;
+  std::uint64_t repetitions = 0;
+  bool acceptFlaky = false;  // a pass after an error does not make the run an error
 };
 
 struct DiagnosticStarted {
@@ -39,6 +44,8 @@ struct DiagnosticStarted {
   ResolvedParameters parameters;
   std::uint64_t seed = 0;
   Date date{};
+  std::uint64_t attempt = 0;     // from 1; 0: the run does not try again
+  std::uint64_t repetition = 0;  // from 1; 0: the run does not repeat
 };
 
 struct StageStarted {
@@ -99,6 +106,7 @@ struct DiagnosticEnded {
 struct RunEnded {
   std::optional<std::string> interrupted;  // the diagnostic that was running at the interruption; empty if none was
   Date date{};
+  std::optional<Verdict> verdict{};  // of the run; only if it has attempts or repetitions and was not interrupted
 };
 
 using RunEvent = std::variant<RunStarted, DiagnosticStarted, StageStarted, StageEnded, Logged, MeasurementsAdded,

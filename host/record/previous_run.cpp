@@ -1,9 +1,13 @@
 #include "host/record/previous_run.h"
 
+#include "host/model/incomplete_run.h"
+#include "host/model/trials.h"
 #include "host/system/user_directory.h"
 
-#include <algorithm>
+#include <map>
+#include <set>
 #include <system_error>
+#include <utility>
 
 namespace quazor {
 
@@ -18,11 +22,20 @@ bool hasPreviousRun(const std::filesystem::path& file) {
 }
 
 std::vector<std::string> failedNames(const RecordedRun& run) {
+  std::map<std::string, std::vector<DiagnosticRecord>> entries;
+  for (const DiagnosticRecord& record : run.records) {
+    DiagnosticRecord entry;  // what the verdict of the run needs
+    entry.name = record.name;
+    entry.verdict = record.verdict;
+    entry.trial = record.trial;
+    entries[record.name].push_back(std::move(entry));
+  }
+  std::set<std::string> incomplete;
+  for (const PlannedDiagnostic& one : missingOf(run.began, run.records)) incomplete.insert(one.name);
   std::vector<std::string> names;
   for (const std::string& name : run.began.names) {
-    const bool passed = std::any_of(run.records.begin(), run.records.end(), [&name](const DiagnosticRecord& one) {
-      return one.name == name && one.verdict == Verdict::kPass;
-    });
+    const bool passed = !incomplete.contains(name) && entries.contains(name) &&
+                        runVerdictOf(entries[name], run.began.acceptFlaky) == Verdict::kPass;
     if (!passed) names.push_back(name);
   }
   return names;

@@ -185,20 +185,36 @@ std::chrono::nanoseconds nanosecondsAt(const Json& json, const char* key) {
 
 // One overload per event, each the reverse of its read function below.
 
+// A count that only some events have: 0 is not written.
+void addCount(Json& json, const char* key, std::uint64_t count) {
+  if (count > 0) json[key] = count;
+}
+
+std::uint64_t countAt(const Json& json, const char* key) {
+  if (!json.contains(key)) return 0;
+  const auto count = get<std::uint64_t>(json, key);
+  if (count == 0) throw InputError(std::string("\"") + key + "\" is 0");
+  return count;
+}
+
 Json jsonOf(const RunStarted& event) {
-  return {{"event", "runBegan"},
-          {"program", losslessText(event.program)},
-          {"contract", event.contract},
-          {"date", timestampText(event.date)},
-          {"plugins", textsJson(event.plugins)},
-          {"phone", losslessText(event.phone)},
-          {"seed", event.seed},
-          {"ofExperiments", event.ofExperiments},
-          {"names", textsJson(event.names)},
-          {"limits", limitsJson(event.limits)},
-          {"id", losslessText(event.id)},
-          {"host", losslessText(event.host)},
-          {"tags", tagsJson(event.tags)}};
+  Json json = {{"event", "runBegan"},
+               {"program", losslessText(event.program)},
+               {"contract", event.contract},
+               {"date", timestampText(event.date)},
+               {"plugins", textsJson(event.plugins)},
+               {"phone", losslessText(event.phone)},
+               {"seed", event.seed},
+               {"ofExperiments", event.ofExperiments},
+               {"names", textsJson(event.names)},
+               {"limits", limitsJson(event.limits)},
+               {"id", losslessText(event.id)},
+               {"host", losslessText(event.host)},
+               {"tags", tagsJson(event.tags)}};
+  addCount(json, "attempts", event.attempts);
+  addCount(json, "repetitions", event.repetitions);
+  if (event.acceptFlaky) json["acceptFlaky"] = true;
+  return json;
 }
 
 RunEvent readRunBegan(const Json& json) {
@@ -213,21 +229,27 @@ RunEvent readRunBegan(const Json& json) {
                     limitsAt(json, "limits"),
                     textAt(json, "id"),
                     textAt(json, "host"),
-                    tagsAt(json, "tags")};
+                    tagsAt(json, "tags"),
+                    countAt(json, "attempts"),
+                    countAt(json, "repetitions"),
+                    json.contains("acceptFlaky") && get<bool>(json, "acceptFlaky")};
 }
 
 Json jsonOf(const DiagnosticStarted& event) {
-  return {{"event", "diagnosticBegan"},
-          {"name", losslessText(event.name)},
-          {"summary", losslessText(event.summary)},
-          {"experiment", losslessText(event.experimentName)},
-          {"analysis", losslessText(event.analysisName)},
-          {"experimentOnly", event.experimentOnly},
-          {"parameters",
-           {{"experiment", parametersJson(event.parameters.experiment)},
-            {"analysis", parametersJson(event.parameters.analysis)}}},
-          {"seed", event.seed},
-          {"date", timestampText(event.date)}};
+  Json json = {{"event", "diagnosticBegan"},
+               {"name", losslessText(event.name)},
+               {"summary", losslessText(event.summary)},
+               {"experiment", losslessText(event.experimentName)},
+               {"analysis", losslessText(event.analysisName)},
+               {"experimentOnly", event.experimentOnly},
+               {"parameters",
+                {{"experiment", parametersJson(event.parameters.experiment)},
+                 {"analysis", parametersJson(event.parameters.analysis)}}},
+               {"seed", event.seed},
+               {"date", timestampText(event.date)}};
+  addCount(json, "attempt", event.attempt);
+  addCount(json, "repetition", event.repetition);
+  return json;
 }
 
 RunEvent readDiagnosticBegan(const Json& json) {
@@ -239,7 +261,9 @@ RunEvent readDiagnosticBegan(const Json& json) {
                            get<bool>(json, "experimentOnly"),
                            {parametersAt(parameters, "experiment"), parametersAt(parameters, "analysis")},
                            get<std::uint64_t>(json, "seed"),
-                           dateAt(json, "date")};
+                           dateAt(json, "date"),
+                           countAt(json, "attempt"),
+                           countAt(json, "repetition")};
 }
 
 Json jsonOf(const StageStarted& event) {
@@ -368,12 +392,14 @@ Json jsonOf(const RunEnded& event) {
   Json json = {{"event", "runEnded"}};
   if (event.interrupted) json["interrupted"] = losslessText(*event.interrupted);
   json["date"] = timestampText(event.date);
+  if (event.verdict) json["verdict"] = nameOf(*event.verdict);
   return json;
 }
 
 RunEvent readRunEnded(const Json& json) {
   RunEnded event{std::nullopt, dateAt(json, "date")};
   if (json.contains("interrupted")) event.interrupted = textAt(json, "interrupted");
+  if (json.contains("verdict")) event.verdict = verdictAt(json, "verdict");
   return event;
 }
 

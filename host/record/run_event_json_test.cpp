@@ -122,6 +122,30 @@ TEST(EventFrom, ReadsTheIdentityOfARunBack) {
   EXPECT_EQ(read.tags, std::get<RunStarted>(run).tags);
 }
 
+TEST(EventFrom, ReadsAttemptsAndRepetitionsBack) {
+  RunStarted run = runOf({});
+  const std::string without = eventJson(run).dump();
+  run.attempts = 3;
+  run.repetitions = 1000;
+  run.acceptFlaky = true;
+  DiagnosticStarted diagnostic = beginningOf("A");
+  diagnostic.attempt = 2;
+  diagnostic.repetition = 7;
+  const std::string kOfRun = R"("attempts":3,"repetitions":1000,"acceptFlaky":true})";
+  EXPECT_TRUE(eventJson(run).dump().ends_with(kOfRun)) << eventJson(run).dump();
+  EXPECT_EQ(eventJson(run).dump().size(), without.size() + kOfRun.size());
+  EXPECT_EQ(eventJson(back(run)).dump(), eventJson(run).dump());
+  EXPECT_TRUE(eventJson(diagnostic).dump().ends_with(R"("attempt":2,"repetition":7})"));
+  EXPECT_EQ(eventJson(back(diagnostic)).dump(), eventJson(diagnostic).dump());
+  const RunEnded ended{std::nullopt, momentAt(7), Verdict::kFail};
+  EXPECT_EQ(std::get<RunEnded>(back(ended)).verdict, Verdict::kFail);
+  for (const char* const wrong : {"0", "-1", "\"2\"", "1.5"}) {
+    nlohmann::ordered_json changed = eventJson(diagnostic);
+    changed["attempt"] = nlohmann::ordered_json::parse(wrong);
+    EXPECT_THROW(eventFrom(changed), InputError) << wrong;
+  }
+}
+
 TEST(EventFrom, RefusesALimitThatCannotBeRead) {
   const std::string text = rows().back().json;
   const auto refusal = [&text](const std::string& before, const std::string& after) {

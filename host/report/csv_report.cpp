@@ -7,6 +7,7 @@
 
 #include <algorithm>
 #include <cstddef>
+#include <cstdint>
 #include <map>
 #include <set>
 #include <utility>
@@ -16,7 +17,7 @@ namespace quazor {
 namespace {
 
 // Groups of columns, from left to right. Within a group, columns are sorted by name.
-enum class Group { kExperiment, kImage, kOfImage, kSample, kSamples, kMeasurement, kValue, kUnit };
+enum class Group { kExperiment, kTrial, kImage, kOfImage, kSample, kSamples, kMeasurement, kValue, kUnit };
 using Column = std::pair<Group, std::string>;
 using Row = std::map<Column, std::string>;
 
@@ -49,11 +50,19 @@ void visitImage(const Row& base, const Dictionary& image, Visit&& visit) {
   }
 }
 
+// The cells of every row of the experiment.
+Row rowOf(const DiagnosticRecord& record) {
+  Row row{{experimentColumn(), textCell(record.name)}};
+  if (record.trial.attempt > 0) row[{Group::kTrial, "attempt"}] = std::to_string(record.trial.attempt);
+  if (record.trial.repetition > 0) row[{Group::kTrial, "repetition"}] = std::to_string(record.trial.repetition);
+  return row;
+}
+
 // Calls `visit` for each row.
 template <class Visit>
 void visitRows(const std::vector<DiagnosticRecord>& records, Visit&& visit) {
   for (const DiagnosticRecord& record : records) {
-    Row row{{experimentColumn(), textCell(record.name)}};
+    Row row = rowOf(record);
     std::size_t number = 0;
     for (const auto& [ignored, value] : record.auxiliaryData) {
       for (const Dictionary* const image : imagesIn(value)) {
@@ -62,10 +71,11 @@ void visitRows(const std::vector<DiagnosticRecord>& records, Visit&& visit) {
       }
     }
     for (const auto& [name, measurement] : record.measurements) {
-      visit(Row{{experimentColumn(), textCell(record.name)},
-                {measurementColumn(), textCell(name)},
-                {valueColumn(), defaultText(measurement.value())},
-                {unitColumn(), textCell(measurement.unit().symbol())}});
+      Row ofMeasurement = rowOf(record);
+      ofMeasurement[measurementColumn()] = textCell(name);
+      ofMeasurement[valueColumn()] = defaultText(measurement.value());
+      ofMeasurement[unitColumn()] = textCell(measurement.unit().symbol());
+      visit(ofMeasurement);
     }
   }
 }
@@ -93,6 +103,18 @@ void addLimit(std::vector<std::string>& cells, const std::optional<QZLimit>& lim
     cells.push_back(bound == nullptr ? std::string() : defaultText(bound->open()));
   }
 }
+
+bool hasAttempts(const std::vector<DiagnosticRecord>& records) {
+  return std::any_of(records.begin(), records.end(), [](const DiagnosticRecord& one) { return one.trial.attempt > 0; });
+}
+
+bool hasRepetitions(const std::vector<DiagnosticRecord>& records) {
+  return std::any_of(records.begin(), records.end(),
+                     [](const DiagnosticRecord& one) { return one.trial.repetition > 0; });
+}
+
+// Empty for 0.
+std::string countCell(std::uint64_t count) { return count == 0 ? std::string() : std::to_string(count); }
 
 bool hasSkips(const std::vector<DiagnosticRecord>& records) {
   return std::any_of(records.begin(), records.end(), [](const DiagnosticRecord& one) { return one.skip.has_value(); });
@@ -177,10 +199,16 @@ std::string diagnosticCsv(const std::vector<DiagnosticRecord>& records) {
   std::vector<std::string_view> columns = kDiagnosticColumns;
   const bool withSkips = hasSkips(records);
   if (withSkips) columns.insert(columns.end(), {"skipKind", "skipReason"});
+  const bool withAttempts = hasAttempts(records);
+  const bool withRepetitions = hasRepetitions(records);
+  if (withAttempts) columns.emplace_back("attempt");
+  if (withRepetitions) columns.emplace_back("repetition");
   appendLine(csv, columns);
   for (const DiagnosticRecord& record : records) {
     std::vector<std::string> more(withSkips ? 2 : 0);
     if (record.skip) more = {std::string(nameOf(record.skip->kind)), textCell(record.skip->reason)};
+    if (withAttempts) more.push_back(countCell(record.trial.attempt));
+    if (withRepetitions) more.push_back(countCell(record.trial.repetition));
     const std::vector<LimitCheck> checks = limitChecksOf(record);
     for (std::size_t i = 0; i < record.measuredResults.size(); ++i) {
       const auto& [result, verdict, ignored] = record.measuredResults[i];

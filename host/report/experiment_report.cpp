@@ -1,7 +1,9 @@
 #include "host/report/experiment_report.h"
 
 #include "contract/message_format.h"
+#include "host/model/variation.h"
 #include "host/report/sample_images.h"
+#include "host/report/variation_report.h"
 #include "host/text/display_width.h"
 #include "host/text/sample_picture.h"
 #include "host/text/table.h"
@@ -142,19 +144,20 @@ void printExperiment(std::ostream& out, const DiagnosticRecord& record, TextStyl
     printAuxiliaryData(out, record.auxiliaryData, style.blocks);
   }
   out << "\n  " << verdictText(record, style.colour) << '\n';
+  if (const std::string trial = trialText(record); !trial.empty()) out << "    " << trial << '\n';
   if (record.verdict == Verdict::kError) out << errorText(record.error, "    ");
   if (record.skip) out << "    " << printable(textOf(*record.skip)) << '\n';
   out << '\n';
 }
 
 void printExperimentSummary(std::ostream& out, const std::vector<DiagnosticRecord>& records) {
-  const auto countOf = [&records](Verdict verdict) {
-    return std::count_if(records.begin(), records.end(),
-                         [verdict](const DiagnosticRecord& one) { return one.verdict == verdict; });
-  };
-  out << records.size() << (records.size() == 1 ? " experiment: " : " experiments: ") << countOf(Verdict::kPass)
-      << " returned a result, " << countOf(Verdict::kError) << " ended in an error";
-  if (const auto skipped = countOf(Verdict::kSkip); skipped > 0) out << ", " << skipped << " skipped";
+  const VerdictCounts counts = verdictCountsOf(records);
+  const bool isRepeated =
+      std::any_of(records.begin(), records.end(), [](const DiagnosticRecord& one) { return one.trial.repetition > 0; });
+  out << countText(counts.all(), isRepeated ? "run" : "experiment") << ": " << counts.passed << " returned a result, "
+      << counts.errors << " ended in an error";
+  if (counts.skipped > 0) out << ", " << counts.skipped << " skipped";
+  if (counts.flaky > 0) out << ", " << counts.flaky << " flaky";
   out << '\n';
 }
 

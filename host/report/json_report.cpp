@@ -27,12 +27,6 @@ Json boundJson(const std::shared_ptr<const QZBound>& bound) {
   return {{"value", numberJson(bound->value().value())}, {"open", bound->open()}};
 }
 
-Json limitJson(const std::optional<QZLimit>& limit) {
-  if (!limit) return {};
-  return {
-      {"name", limit->name()}, {"lower", boundJson(limit->lowerBound())}, {"upper", boundJson(limit->upperBound())}};
-}
-
 Json checkJson(const LimitCheck& check) {
   Json json = {{"limit", canonicalText(check.limit)},
                {"name", check.limit.name},
@@ -109,6 +103,8 @@ Json declarationJson(const std::string& name, const QZDescription& description,
 // A record with its results and its analysis, or what an experiment alone has of it.
 Json recordJson(const DiagnosticRecord& record, Json parameters, bool hasAnalysis) {
   Json json = {{"name", record.name}, {"summary", record.summary}, {"verdict", nameOf(record.verdict)}};
+  if (record.trial.attempt > 0) json["attempt"] = record.trial.attempt;
+  if (record.trial.repetition > 0) json["repetition"] = record.trial.repetition;
   if (record.skip) json["skip"] = {{"kind", nameOf(record.skip->kind)}, {"reason", record.skip->reason}};
   json["parameters"] = std::move(parameters);
   if (hasAnalysis) json["measuredResults"] = resultsJson(record);
@@ -127,6 +123,12 @@ Json recordJson(const DiagnosticRecord& record, Json parameters, bool hasAnalysi
 }
 
 }  // namespace
+
+Json limitJson(const std::optional<QZLimit>& limit) {
+  if (!limit) return {};
+  return {
+      {"name", limit->name()}, {"lower", boundJson(limit->lowerBound())}, {"upper", boundJson(limit->upperBound())}};
+}
 
 Json recordJson(const DiagnosticRecord& record) { return recordJson(record, parametersJson(record.parameters), true); }
 

@@ -13,6 +13,9 @@
 
 namespace quazor {
 
+// Null without a limit.
+nlohmann::ordered_json limitJson(const std::optional<QZLimit>& limit);
+
 nlohmann::ordered_json recordJson(const DiagnosticRecord& record);
 
 // The record of an experiment on its own.

@@ -4,8 +4,10 @@
 #include "host/error/host_error.h"
 #include "host/model/incomplete_run.h"
 #include "host/model/limit_check.h"
+#include "host/model/trials.h"
 #include "host/report/junit_suite.h"
 #include "host/report/text_report.h"
+#include "host/report/variation_report.h"
 
 #include <cstddef>
 #include <cstdint>
@@ -108,12 +110,35 @@ bool isOfResult(const DiagnosticError& error) {
          error.code() == static_cast<std::int64_t>(HostErrorCode::kCannotBeJudged);
 }
 
+void addTrial(JUnitProperties& properties, const Trial& trial) {
+  if (trial.attempt > 0) properties.add("attempt", std::to_string(trial.attempt));
+  if (trial.repetition > 0) properties.add("repetition", std::to_string(trial.repetition));
+}
+
+// An error that was accepted, because a later attempt had none, does not make a build fail.
+JUnitSuite suiteOfSuperseded(const RunStarted& run, const DiagnosticRecord& record) {
+  JUnitSuite suite(record.name, record.begin, record.end);
+  suite.properties().add("verdict", std::string(nameOf(record.verdict)));
+  suite.properties().add("summary", record.summary);
+  suite.properties().add("seed", std::to_string(record.seed));
+  addTrial(suite.properties(), record.trial);
+  addParameters(suite.properties(), "experiment", record.parameters.experiment);
+  addParameters(suite.properties(), "analysis", record.parameters.analysis);
+  addRun(suite.properties(), run);
+  suite.addSkipped("superseded", formatMessage("%@ ended in an error, which was accepted because a later attempt had "
+                                               "none:\n%@",
+                                               trialText(record), errorText(record.error, "")));
+  suite.addLog(record.log);
+  return suite;
+}
+
 JUnitSuite suiteOf(const RunStarted& run, const DiagnosticRecord& record) {
   JUnitSuite suite(record.name, record.begin, record.end);
   JUnitProperties& properties = suite.properties();
   properties.add("verdict", std::string(nameOf(record.verdict)));
   properties.add("summary", record.summary);
   properties.add("seed", std::to_string(record.seed));
+  addTrial(properties, record.trial);
   addParameters(properties, "experiment", record.parameters.experiment);
   addParameters(properties, "analysis", record.parameters.analysis);
   addRun(properties, run);
@@ -149,7 +174,10 @@ std::string junitReport(const RunStarted& run, const std::vector<DiagnosticRecor
     counts += suite.counts();
     suites += suite.xml();
   };
-  for (const DiagnosticRecord& record : records) add(suiteOf(run, record));
+  for (std::size_t i = 0; i < records.size(); ++i) {
+    const bool isAccepted = run.acceptFlaky && isSuperseded(records, i);
+    add(isAccepted ? suiteOfSuperseded(run, records[i]) : suiteOf(run, records[i]));
+  }
   const Date end = records.empty() ? run.date : records.back().end;
   const UnrecordedDiagnostics unrecorded = unrecordedDiagnosticsOf(run, records, interrupted);
   if (unrecorded.interrupted) {
@@ -158,8 +186,9 @@ std::string junitReport(const RunStarted& run, const std::vector<DiagnosticRecor
     suite.addError("interrupted", {}, interruptionOf(run, name));
     add(suite);
   }
-  for (const std::string& name : unrecorded.neverRun) {
-    JUnitSuite suite = suiteOfUnrecorded(run, name, end);
+  for (const PlannedDiagnostic& one : unrecorded.neverRun) {
+    JUnitSuite suite = suiteOfUnrecorded(run, one.name, end);
+    if (one.repetition > 0) suite.properties().add("repetition", std::to_string(one.repetition));
     suite.addSkipped("never-run", "The run ended before this was started.");
     add(suite);
   }

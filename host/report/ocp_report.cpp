@@ -200,6 +200,8 @@ class OcpRecordWriter {
     addText(metadata, "experiment", record_.experimentName);
     addText(metadata, "analysis", record_.analysisName);
     if (record_.skip) metadata["skip"] = {{"kind", nameOf(record_.skip->kind)}, {"reason", record_.skip->reason}};
+    if (record_.trial.attempt > 0) metadata["attempt"] = record_.trial.attempt;
+    if (record_.trial.repetition > 0) metadata["repetition"] = record_.trial.repetition;
     RunStarted ofRecord = run_;
     ofRecord.seed = record_.seed;
     ofRecord.ofExperiments = record_.experimentOnly;
@@ -350,9 +352,11 @@ std::string ocpReport(const RunStarted& run, const std::vector<DiagnosticRecord>
               [&stream, end](Json error) { stream.addToRun("error", std::move(error), end); });
     stream.end("ERROR", "NOT_APPLICABLE", end);
   }
-  for (const std::string& name : unrecorded.neverRun) {
+  for (const auto& [name, repetition] : unrecorded.neverRun) {
     OcpStream stream(report, noLog, end);
-    stream.addToRun("testRunStart", startJson(run, name, commandOf(run, {name}, {})), end);
+    Json metadata = Json::object();
+    if (repetition > 0) metadata["repetition"] = repetition;
+    stream.addToRun("testRunStart", startJson(run, name, commandOf(run, {name}, {}), {}, std::move(metadata)), end);
     stream.addToRun("log", {{"severity", "INFO"}, {"message", "The run ended before this was started."}}, end);
     stream.end("SKIP", "NOT_APPLICABLE", end);
   }

@@ -2,6 +2,7 @@
 
 #include "contract/message_format.h"
 #include "host/model/limit_check.h"
+#include "host/model/trials.h"
 #include "host/report/text_report.h"
 
 #include <algorithm>
@@ -62,7 +63,7 @@ Facts factsOf(const DiagnosticRecord& record) {
 
 OrderedMap<Facts> factsOf(const RecordedRun& run) {
   OrderedMap<Facts> facts;
-  for (const DiagnosticRecord& record : run.records) facts.set(record.name, factsOf(record));
+  for (const DiagnosticRecord& record : run.records) facts.set(record.name + trialSuffix(record), factsOf(record));
   return facts;
 }
 

@@ -2,6 +2,8 @@
 
 #include "base/text/nearest_name.h"
 #include "host/error/exit_code.h"
+#include "host/model/trials.h"
+#include "host/model/variation.h"
 #include "host/record/value_json.h"
 #include "host/report/csv_report.h"
 #include "host/report/experiment_report.h"
@@ -10,6 +12,7 @@
 #include "host/report/ocp_report.h"
 #include "host/report/run_identity.h"
 #include "host/report/short_report.h"
+#include "host/report/variation_report.h"
 #include "host/text/display_width.h"
 #include "host/text/table.h"
 
@@ -75,6 +78,12 @@ std::string reportText(Format format, const RunStarted& run, const std::vector<D
   }
   nlohmann::ordered_json document =
       run.ofExperiments ? experimentDocument(records, interrupted) : runDocument(records, interrupted);
+  if (run.attempts > 0 || run.repetitions > 0 || hasTrials(records)) {
+    document["verdict"] = nameOf(runVerdictOf(records, run.acceptFlaky));
+    if (const nlohmann::ordered_json variation = variationJson(records); !variation.empty()) {
+      document["variation"] = variation;
+    }
+  }
   document["run"] = runJson(run);
   return documentText(document);
 }
@@ -93,9 +102,13 @@ void printReport(std::ostream& out, const RunStarted& run, const DiagnosticRecor
 
 void printEnd(std::ostream& out, const RunStarted& run, const std::vector<DiagnosticRecord>& records,
               const std::optional<std::string>& interrupted, const TextContent& text, bool colour) {
+  printVariation(out, records);
   if (records.size() != 1 || interrupted) {
     run.ofExperiments ? printExperimentSummary(out, records) : printSummary(out, records);
   }
+  const bool hasFlaky = verdictCountsOf(records).flaky > 0;
+  if (hasFlaky && !run.acceptFlaky)
+    out << "A pass after an error counts as an error, unless --accept-flaky is given.\n";
   if (!run.ofExperiments) printFailures(out, records, colour, text.isExplained);
 }
 

@@ -37,15 +37,19 @@ std::vector<std::pair<std::string, std::string>> columnsOf(const RunStarted& run
 Json runJson(const RunStarted& run) {
   Json tags = Json::object();
   for (const auto& [key, value] : run.tags) tags[key] = value;
-  return {{"id", run.id},
-          {"date", timestampText(run.date)},
-          {"host", run.host},
-          {"program", run.program},
-          {"contract", run.contract},
-          {"plugins", run.plugins},
-          {"phone", run.phone},
-          {"seed", run.seed},
-          {"tags", std::move(tags)}};
+  Json json = {{"id", run.id},
+               {"date", timestampText(run.date)},
+               {"host", run.host},
+               {"program", run.program},
+               {"contract", run.contract},
+               {"plugins", run.plugins},
+               {"phone", run.phone},
+               {"seed", run.seed},
+               {"tags", std::move(tags)}};
+  if (run.attempts > 0) json["attempts"] = run.attempts;
+  if (run.repetitions > 0) json["repetitions"] = run.repetitions;
+  if (run.acceptFlaky) json["acceptFlaky"] = true;
+  return json;
 }
 
 std::string withRunColumns(const std::string& csv, const RunStarted& run) {

@@ -2,14 +2,27 @@
 
 #include "backends/log/standard_error_log.h"
 #include "host/report/text_report.h"
+#include "host/report/variation_report.h"
 #include "host/system/output_file.h"
 #include "host/text/table.h"
 #include "host/text/terminal.h"
 
-#include <algorithm>
 #include <utility>
 
 namespace quazor {
+
+namespace {
+
+// Tells people who wait for a repeated run how far it is.
+std::string suffixOf(const DiagnosticStarted& diagnostic, const RunStarted& run) {
+  DiagnosticRecord record;
+  record.trial = {diagnostic.attempt, run.attempts, diagnostic.repetition, run.repetitions};
+  if (diagnostic.attempt <= 1) record.verdict = Verdict::kPass;
+  const std::string trial = trialText(record);
+  return trial.empty() ? trial : ", " + trial;
+}
+
+}  // namespace
 
 RunReport::RunReport(ReportOptions options, Console& console)
     : options_(std::move(options)), console_(console), progress_(console.showsProgress ? &console.err : nullptr) {}
@@ -18,7 +31,7 @@ void RunReport::onEvent(const RunEvent& event) {
   if (const auto* const began = std::get_if<RunStarted>(&event)) {
     run_ = *began;
   } else if (const auto* const diagnostic = std::get_if<DiagnosticStarted>(&event)) {
-    progress_.start(diagnostic->name, expectedProgressOf(diagnostic->parameters));
+    progress_.start(diagnostic->name + suffixOf(*diagnostic, run_), expectedProgressOf(diagnostic->parameters));
   } else if (const auto* const logged = std::get_if<Logged>(&event)) {
     const LogLine& line = logged->line;
     if (line.level > options_.shownLog) return;
@@ -87,18 +100,10 @@ void RunReport::writeFile(const OutputRequest& output, const std::optional<std::
 }
 
 ExitCode RunReport::exitCode() const {
-  return allWritten_ ? exitCodeOf(records_, options_.exitRules) : ExitCode::kCannotWrite;
-}
-
-ExitCode exitCodeOf(const std::vector<DiagnosticRecord>& records, const ExitRules& rules) {
-  const auto countOf = [&records](Verdict verdict) {
-    return std::count_if(records.begin(), records.end(),
-                         [verdict](const DiagnosticRecord& one) { return one.verdict == verdict; });
-  };
-  if (countOf(Verdict::kError) > 0) return ExitCode::kError;
-  if (countOf(Verdict::kFail) > 0) return ExitCode::kFailed;
-  const bool isSkipped = countOf(Verdict::kSkip) > 0;
-  return isSkipped && (!rules.allowSkips || countOf(Verdict::kPass) == 0) ? ExitCode::kError : ExitCode::kAllPassed;
+  if (!allWritten_) return ExitCode::kCannotWrite;
+  ExitRules rules = options_.exitRules;
+  rules.acceptFlaky = run_.acceptFlaky;
+  return exitCodeOf(records_, rules);
 }
 
 }  // namespace quazor

@@ -5,6 +5,7 @@
 #include "host/error/exit_code.h"
 #include "host/model/diagnostic_record.h"
 #include "host/model/run_event.h"
+#include "host/model/trials.h"
 #include "host/report/progress.h"
 #include "host/report/report_format.h"
 
@@ -22,11 +23,6 @@ struct Console {
   bool colour = false;         // `out` supports colour
   bool showsProgress = false;  // `err` is a terminal
   bool blocks = false;         // `out` supports UTF-8 and block elements
-};
-
-// What the user allows in a run with exit code 0.
-struct ExitRules {
-  bool allowSkips = false;
 };
 
 struct ReportOptions {
@@ -70,9 +66,5 @@ class RunReport final : public RunEventSink {
   std::vector<DiagnosticRecord> records_;
   bool allWritten_ = true;
 };
-
-// The exit code for the verdicts. An error takes precedence over a failure, and a failure over a skip that is not
-// allowed. That all were skipped is never allowed.
-ExitCode exitCodeOf(const std::vector<DiagnosticRecord>& records, const ExitRules& rules = {});
 
 }  // namespace quazor

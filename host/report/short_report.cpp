@@ -2,7 +2,9 @@
 
 #include "contract/message_format.h"
 #include "host/model/limit_check.h"
+#include "host/model/trials.h"
 #include "host/report/text_report.h"
+#include "host/report/variation_report.h"
 #include "host/text/display_width.h"
 #include "host/text/shell_word.h"
 #include "host/text/table.h"
@@ -65,6 +67,44 @@ std::string failureText(const DiagnosticRecord& record) {
   return listText(failedResults(record));
 }
 
+// A line that says what did not pass. The repetitions that ended alike share one.
+struct FailureLine {
+  std::string text;
+  std::string first;  // the attempt and repetition of the first
+  bool isRepeated = false;
+  std::size_t times = 1;
+};
+
+FailureLine lineOf(const std::vector<DiagnosticRecord>& records, std::size_t index, bool colour) {
+  const DiagnosticRecord& record = records[index];
+  FailureLine line{{}, trialText(record), record.trial.repetition > 0};
+  if (isFlaky(record) && record.verdict == Verdict::kPass) {
+    line.text = flakyColumn(colour) + printable(record.name);
+    const DiagnosticErrorPtr before = index == 0 ? nullptr : records[index - 1].error;  // of the attempt before
+    if (before != nullptr) line.text += printable(formatMessage(": %@ code %@", before->domain(), before->code()));
+  } else {
+    line.text = verdictColumn(record, colour) + printable(record.name);
+    if (const std::string text = failureText(record); !text.empty()) line.text += ": " + printable(text);
+  }
+  return line;
+}
+
+void addLine(std::vector<FailureLine>& lines, FailureLine line) {
+  const auto same = std::find_if(lines.begin(), lines.end(), [&line](const FailureLine& one) {
+    return one.isRepeated && line.isRepeated && one.text == line.text;
+  });
+  if (same == lines.end()) {
+    lines.push_back(std::move(line));
+  } else {
+    ++same->times;
+  }
+}
+
+std::string textOf(const FailureLine& line) {
+  if (line.times > 1) return formatMessage("%@ (%@ times, first in %@)", line.text, line.times, line.first);
+  return line.first.empty() ? line.text : formatMessage("%@ (%@)", line.text, line.first);
+}
+
 // What to ask about a diagnostic that did not pass, the most specific first.
 std::vector<std::string> topicsOf(const DiagnosticRecord& record) {
   std::vector<std::string> topics;
@@ -103,8 +143,10 @@ std::string resultCountsText(const DiagnosticRecord& record) {
 }
 
 void printShortRecord(std::ostream& out, const DiagnosticRecord& record, bool colour, std::size_t nameWidth) {
-  if (record.skip) return printVerdict(out, record, colour, printable(textOf(*record.skip)), nameWidth);
-  printVerdict(out, record, colour, resultCountsText(record), nameWidth);
+  const std::string more = record.skip ? printable(textOf(*record.skip)) : resultCountsText(record);
+  const std::string trial = trialText(record);
+  printVerdict(out, record, colour, trial + (trial.empty() || more.empty() ? "" : ", ") + more, nameWidth);
+  if (record.skip) return;
   const bool passed = record.verdict == Verdict::kPass;
   std::ostringstream table;
   prepareFor(out, table);
@@ -118,16 +160,17 @@ void printShortRecord(std::ostream& out, const DiagnosticRecord& record, bool co
 void printFailures(std::ostream& out, const std::vector<DiagnosticRecord>& records, bool colour,
                    const std::function<bool(const std::string& topic)>& isExplained) {
   std::vector<std::string> asked;
-  for (const DiagnosticRecord& record : records) {
-    if (record.verdict == Verdict::kPass) continue;
-    out << verdictColumn(record, colour) << printable(record.name);
-    if (const std::string text = failureText(record); !text.empty()) out << ": " << printable(text);
-    out << '\n';
-    if (!isExplained || record.skip) continue;
+  std::vector<FailureLine> lines;
+  for (std::size_t i = 0; i < records.size(); ++i) {
+    const DiagnosticRecord& record = records[i];
+    if (record.verdict == Verdict::kPass && !isFlaky(record)) continue;
+    if (!hasLaterAttempt(records, i)) addLine(lines, lineOf(records, i, colour));
+    if (!isExplained || record.skip || record.verdict == Verdict::kPass) continue;
     const std::vector<std::string> topics = topicsOf(record);
     const auto found = std::find_if(topics.begin(), topics.end(), isExplained);
     if (found != topics.end() && std::find(asked.begin(), asked.end(), *found) == asked.end()) asked.push_back(*found);
   }
+  for (const FailureLine& line : lines) out << textOf(line) << '\n';
   if (asked.empty()) return;
   const std::string command = "quazor explain";
   std::string all = "Next: " + command;

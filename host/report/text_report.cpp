@@ -3,6 +3,8 @@
 #include "contract/message_format.h"
 #include "host/error/host_error.h"
 #include "host/model/limit_check.h"
+#include "host/model/variation.h"
+#include "host/report/variation_report.h"
 #include "host/text/display_width.h"
 #include "host/text/table.h"
 
@@ -175,6 +177,10 @@ std::string verdictText(const DiagnosticRecord& record, bool colour) {
   return colour ? std::string(colourOf(record.verdict)) + word + std::string(kPlain) : word;
 }
 
+std::string flakyColumn(bool colour) {
+  return colour ? std::string(kYellow) + "FLAKY" + std::string(kPlain) + " " : "FLAKY ";
+}
+
 std::string verdictColumn(const DiagnosticRecord& record, bool colour) {
   return verdictText(record, colour) + std::string(std::string_view("ERROR ").size() - wordOf(record).size(), ' ');
 }
@@ -186,6 +192,7 @@ void printRecord(std::ostream& out, const DiagnosticRecord& record, bool colour)
     printResults(out, record, ResultRows::kAll, colour);
   }
   out << "\n  " << verdictText(record, colour) << '\n';
+  if (const std::string trial = trialText(record); !trial.empty()) out << "    " << trial << '\n';
   if (record.verdict == Verdict::kError) out << errorText(record.error, "    ");
   if (record.skip) out << "    " << printable(textOf(*record.skip)) << '\n';
   out << '\n';
@@ -200,14 +207,13 @@ void printVerdict(std::ostream& out, const DiagnosticRecord& record, bool colour
 }
 
 void printSummary(std::ostream& out, const std::vector<DiagnosticRecord>& records) {
-  const auto countOf = [&records](Verdict verdict) {
-    return static_cast<std::size_t>(std::count_if(
-        records.begin(), records.end(), [verdict](const DiagnosticRecord& one) { return one.verdict == verdict; }));
-  };
-  out << count(records.size(), records.size() == 1 ? "diagnostic" : "diagnostics") << ": "
-      << count(countOf(Verdict::kPass), "passed") << ", " << count(countOf(Verdict::kFail), "failed") << ", "
-      << count(countOf(Verdict::kError), "ended in an error");
-  if (const std::size_t skipped = countOf(Verdict::kSkip); skipped > 0) out << ", " << count(skipped, "skipped");
+  const VerdictCounts counts = verdictCountsOf(records);
+  const bool isRepeated =
+      std::any_of(records.begin(), records.end(), [](const DiagnosticRecord& one) { return one.trial.repetition > 0; });
+  out << countText(counts.all(), isRepeated ? "run" : "diagnostic") << ": " << count(counts.passed, "passed") << ", "
+      << count(counts.failed, "failed") << ", " << count(counts.errors, "ended in an error");
+  if (counts.skipped > 0) out << ", " << count(counts.skipped, "skipped");
+  if (counts.flaky > 0) out << ", " << count(counts.flaky, "flaky");
   if (const std::size_t warnings = warningsIn(records); warnings > 0) {
     out << ", " << count(warnings, warnings == 1 ? "warning" : "warnings");
   }

@@ -33,6 +33,8 @@ std::string_view errorStageText(const DiagnosticRecord& record);
 std::string verdictText(const DiagnosticRecord& record, bool colour);
 // The same, padded to a column of its own.
 std::string verdictColumn(const DiagnosticRecord& record, bool colour);
+// "FLAKY" in that column, for a pass after an error.
+std::string flakyColumn(bool colour);
 
 // Prints one diagnostic's measured results as a table, then its verdict and, for kError, the error.
 void printRecord(std::ostream& out, const DiagnosticRecord& record, bool colour);

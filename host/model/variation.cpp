@@ -1,0 +1,128 @@
+#include "host/model/variation.h"
+
+#include "host/model/trials.h"
+
+#include <algorithm>
+#include <cmath>
+#include <iterator>
+#include <limits>
+#include <map>
+#include <tuple>
+#include <utility>
+
+namespace quazor {
+
+namespace {
+
+// All values of one result.
+struct Series {
+  std::string name;
+  std::string unit;
+  std::vector<double> values;
+  std::optional<QZLimit> limit;
+};
+
+// The series of one diagnostic. A name that occurs again in an entry, or another unit, is another series.
+// Thread: one at a time.
+class SeriesOfDiagnostic {
+ public:
+  void add(const DiagnosticRecord& record) {
+    std::map<std::string, std::size_t> seen;
+    if (record.experimentOnly) {
+      for (const auto& [name, measurement] : record.measurements) addValue(seen, name, measurement, std::nullopt);
+    }
+    for (const JudgedResult& one : record.measuredResults) {
+      addValue(seen, one.result.name(), one.result.measurement(), one.result.limit());
+    }
+  }
+
+  const std::vector<Series>& all() const { return series_; }
+
+ private:
+  using Key = std::tuple<std::string, std::size_t, std::string>;
+
+  void addValue(std::map<std::string, std::size_t>& seen, const std::string& name, const Measurement& measurement,
+                const std::optional<QZLimit>& limit) {
+    const std::string& unit = measurement.unit().symbol();
+    const auto [place, isNew] = places_.emplace(Key{name, seen[name]++, unit}, series_.size());
+    if (isNew) series_.push_back({name, unit, {}, std::nullopt});
+    Series& series = series_[place->second];
+    series.values.push_back(measurement.value());
+    if (!series.limit) series.limit = limit;
+  }
+
+  std::map<Key, std::size_t> places_;
+  std::vector<Series> series_;
+};
+
+bool isSame(double one, double other) { return one == other || (std::isnan(one) && std::isnan(other)); }
+
+bool varies(const Series& series) {
+  return std::any_of(series.values.begin(), series.values.end(),
+                     [&series](double one) { return !isSame(one, series.values.front()); });
+}
+
+VaryingResult summaryOf(const Series& series) {
+  constexpr double kNone = std::numeric_limits<double>::quiet_NaN();
+  VaryingResult result{series.name, series.unit, series.values.size(), kNone, kNone, kNone, series.limit};
+  std::vector<double> finite;
+  std::copy_if(series.values.begin(), series.values.end(), std::back_inserter(finite),
+               [](double one) { return std::isfinite(one); });
+  if (finite.empty()) return result;
+  std::sort(finite.begin(), finite.end());
+  const std::size_t middle = finite.size() / 2;
+  const bool isOdd = finite.size() % 2 == 1;
+  result.minimum = finite.front();
+  result.maximum = finite.back();
+  result.median = isOdd ? finite[middle] : finite[middle - 1] / 2 + finite[middle] / 2;  // their sum may overflow
+  return result;
+}
+
+void count(VerdictCounts& counts, const DiagnosticRecord& record) {
+  switch (record.verdict) {
+    case Verdict::kPass: ++(isFlaky(record) ? counts.flaky : counts.passed); return;
+    case Verdict::kFail: ++counts.failed; return;
+    case Verdict::kError: ++counts.errors; return;
+    case Verdict::kSkip: break;
+  }
+  ++counts.skipped;
+}
+
+}  // namespace
+
+VerdictCounts verdictCountsOf(const std::vector<DiagnosticRecord>& records) {
+  VerdictCounts counts;
+  for (std::size_t i = 0; i < records.size(); ++i) {
+    if (!hasLaterAttempt(records, i)) count(counts, records[i]);
+  }
+  return counts;
+}
+
+std::vector<DiagnosticVariation> variationOf(const std::vector<DiagnosticRecord>& records) {
+  std::vector<DiagnosticVariation> variations;
+  std::vector<SeriesOfDiagnostic> series;
+  std::map<std::string, std::size_t> places;
+  for (std::size_t i = 0; i < records.size(); ++i) {
+    const DiagnosticRecord& record = records[i];
+    if (record.trial.repetition == 0) continue;
+    const auto [place, isNew] = places.emplace(record.name, variations.size());
+    if (isNew) {
+      variations.push_back({record.name, {}, {}, 0});
+      series.emplace_back();
+    }
+    if (!hasLaterAttempt(records, i)) count(variations[place->second].verdicts, record);
+    if (record.error == nullptr) series[place->second].add(record);
+  }
+  for (std::size_t i = 0; i < variations.size(); ++i) {
+    for (const Series& one : series[i].all()) {
+      if (varies(one)) {
+        variations[i].varying.push_back(summaryOf(one));
+      } else {
+        ++variations[i].constant;
+      }
+    }
+  }
+  return variations;
+}
+
+}  // namespace quazor

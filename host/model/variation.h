@@ -1,0 +1,49 @@
+// What varied between the repetitions of a run.
+#pragma once
+
+#include "host/model/diagnostic_record.h"
+
+#include <cstddef>
+#include <optional>
+#include <string>
+#include <vector>
+
+namespace quazor {
+
+// How the repetitions of a diagnostic ended. An attempt that was followed by another one is not counted.
+struct VerdictCounts {
+  std::size_t passed = 0;  // in the first attempt
+  std::size_t flaky = 0;   // passed after an error
+  std::size_t failed = 0;
+  std::size_t errors = 0;
+  std::size_t skipped = 0;
+
+  std::size_t all() const { return passed + flaky + failed + errors + skipped; }
+};
+
+VerdictCounts verdictCountsOf(const std::vector<DiagnosticRecord>& records);
+
+// A result, or a measurement of an experiment on its own, whose value was not the same every time. The least, middle
+// and greatest value are those of the finite values; they are not a number if there is none.
+struct VaryingResult {
+  std::string name;
+  std::string unit;
+  std::size_t values = 0;  // that were compared, also those that are not finite
+  double minimum = 0;
+  double median = 0;
+  double maximum = 0;
+  std::optional<QZLimit> limit;  // the first that it had
+};
+
+struct DiagnosticVariation {
+  std::string name;
+  VerdictCounts verdicts;
+  std::vector<VaryingResult> varying;  // in the order of the results
+  std::size_t constant = 0;            // the number of results that never varied
+};
+
+// One for each diagnostic or experiment that was repeated, in the order in which they began. Results count only where
+// the diagnostic ended without an error. Results of one name in one entry are told apart by their place.
+std::vector<DiagnosticVariation> variationOf(const std::vector<DiagnosticRecord>& records);
+
+}  // namespace quazor

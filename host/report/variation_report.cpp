@@ -1,0 +1,109 @@
+#include "host/report/variation_report.h"
+
+#include "contract/message_format.h"
+#include "host/model/trials.h"
+#include "host/model/variation.h"
+#include "host/record/value_json.h"
+#include "host/report/json_report.h"
+#include "host/report/text_report.h"
+#include "host/text/table.h"
+
+#include <cstddef>
+#include <cstdint>
+#include <string_view>
+#include <utility>
+
+namespace quazor {
+
+using Json = nlohmann::ordered_json;
+
+namespace {
+
+std::string numberOf(std::string_view what, std::uint64_t number, std::uint64_t most) {
+  return most == 0 ? formatMessage("%@ %@", what, number) : formatMessage("%@ %@ of %@", what, number, most);
+}
+
+std::string countsText(const VerdictCounts& counts, bool ofExperiment) {
+  const std::pair<std::size_t, std::string_view> parts[] = {
+      {counts.passed, ofExperiment ? "returned a result" : "passed"},
+      {counts.flaky, "flaky"},
+      {counts.failed, "failed"},
+      {counts.errors, "ended in an error"},
+      {counts.skipped, "skipped"}};
+  std::string text;
+  for (const auto& [number, what] : parts) {
+    if (number > 0) text += formatMessage("%@%@ %@", text.empty() ? "" : ", ", number, what);
+  }
+  return text;
+}
+
+Json countsJson(const VerdictCounts& counts) {
+  return {{"pass", counts.passed},
+          {"flaky", counts.flaky},
+          {"fail", counts.failed},
+          {"error", counts.errors},
+          {"skip", counts.skipped}};
+}
+
+void printVarying(std::ostream& out, const std::vector<VaryingResult>& results) {
+  using Align = Table::Align;
+  Table table({Align::kLeft, Align::kRight, Align::kRight, Align::kRight, Align::kRight, Align::kLeft, Align::kLeft});
+  table.addHeader({"Result", "Values", "Minimum", "Median", "Maximum", "Unit", "Limit"});
+  for (const VaryingResult& one : results) {
+    table.addRow({printable(one.name), std::to_string(one.values), defaultText(one.minimum), defaultText(one.median),
+                  defaultText(one.maximum), printable(one.unit), limitText(one.limit)});
+  }
+  table.print(out, "  ");
+}
+
+}  // namespace
+
+std::string trialText(const DiagnosticRecord& record) {
+  const auto& [attempt, attempts, repetition, repetitions] = record.trial;
+  std::string text;
+  if (repetition > 0) text = numberOf("repetition", repetition, repetitions);
+  const bool passed = record.verdict == Verdict::kPass;
+  if (attempt == 0 || (attempt == 1 && record.verdict != Verdict::kError)) return text;
+  if (!text.empty()) text += ", ";
+  return text + (passed ? "pass in " : "") + numberOf("attempt", attempt, attempts);
+}
+
+void printVariation(std::ostream& out, const std::vector<DiagnosticRecord>& records) {
+  const std::vector<DiagnosticVariation> variations = variationOf(records);
+  if (variations.empty()) return;
+  const bool ofExperiments = records.back().experimentOnly;
+  out << "What varied between the repetitions:\n";
+  for (const DiagnosticVariation& one : variations) {
+    out << printable(one.name) << ": " << countsText(one.verdicts, ofExperiments) << '\n';
+    if (!one.varying.empty()) printVarying(out, one.varying);
+    const std::size_t all = one.varying.size() + one.constant;
+    if (one.constant > 0) {
+      const std::string what = ofExperiments ? "measurement" : "result";
+      out << "  " << countText(one.constant, one.constant == all ? what : "other " + what) << " never varied\n";
+    }
+  }
+  out << '\n';
+}
+
+Json variationJson(const std::vector<DiagnosticRecord>& records) {
+  Json json = Json::array();
+  for (const DiagnosticVariation& one : variationOf(records)) {
+    Json varying = Json::array();
+    for (const VaryingResult& result : one.varying) {
+      varying.push_back({{"name", result.name},
+                         {"unit", result.unit},
+                         {"values", result.values},
+                         {"minimum", numberJson(result.minimum)},
+                         {"median", numberJson(result.median)},
+                         {"maximum", numberJson(result.maximum)},
+                         {"limit", limitJson(result.limit)}});
+    }
+    json.push_back({{"name", one.name},
+                    {"verdicts", countsJson(one.verdicts)},
+                    {"varying", std::move(varying)},
+                    {"constant", one.constant}});
+  }
+  return json;
+}
+
+}  // namespace quazor
