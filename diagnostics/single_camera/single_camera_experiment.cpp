@@ -85,8 +85,7 @@ QZDescription QZSingleCameraExperiment::experimentDescription() const {
   description.addParameter(
       QZNumberParameter("The position of the camera among those of the device, from 0; default 0.", false), "camera");
   description.addParameter(QZNumberParameter("The frame rate to ask for, per second; default 30.", false), "frameRate");
-  description.addParameter(QZNumberParameter("The format to ask for; by default the one that the camera has.", false),
-                           "formatIndex");
+  description.addParameter(QZNumberParameter("The index of the format to ask for; default 0.", false), "formatIndex");
   return description;
 }
 
@@ -114,7 +113,7 @@ bool QZSingleCameraExperiment::setupWithParameters(const Dictionary& parameters,
   duration_ = duration;
   frameRate_ = frameRate;
   camera_ = static_cast<std::uint64_t>(camera);
-  if (parameters.find("formatIndex") != nullptr) formatIndex_ = static_cast<std::int64_t>(formatIndex);
+  formatIndex_ = static_cast<std::uint64_t>(formatIndex);
   return true;
 }
 
@@ -160,8 +159,8 @@ bool QZSingleCameraExperiment::configureStream(const std::shared_ptr<FrameRecord
       {std::string(capture_key::PixelBufferHandler),
        Value(std::make_shared<PixelBufferHandler>(
            [recorder](PixelBuffer& /*buffer*/, MediaTime presentationTime) { recorder->add(presentationTime); }))}};
-  return (!formatIndex_ || set(capture_key::FormatIndex, *formatIndex_)) &&
-         set(capture_key::MinimumFrameRate, frameRate_) && set(capture_key::MaximumFrameRate, frameRate_) &&
+  return set(capture_key::FormatIndex, formatIndex_) && set(capture_key::MinimumFrameRate, frameRate_) &&
+         set(capture_key::MaximumFrameRate, frameRate_) &&
          set(capture_key::VideoOutputsEnabled, forPrimaryScaler(true)) &&
          set(capture_key::VideoOutputHandlers, forPrimaryScaler(handlers));
 }
@@ -207,8 +206,10 @@ std::unique_ptr<QZExperimentResult> QZSingleCameraExperiment::stream(FrameRecord
 
 bool QZSingleCameraExperiment::teardown(DiagnosticErrorPtr* error) {
   DiagnosticErrorPtr reason;
+  stream_ = nullptr;
+  const std::shared_ptr<CaptureDevice> device = std::exchange(device_, nullptr);
   // Without a device the run has told why.
-  if (device_ == nullptr || device_->invalidate(&reason)) return true;
+  if (device == nullptr || device->invalidate(&reason)) return true;
   fail(error, SingleCameraErrorDomain, single_camera_error::kNoDevice, reason,
        "The capture device cannot be released.");
   return false;

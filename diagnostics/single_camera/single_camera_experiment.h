@@ -35,7 +35,7 @@ class QZSingleCameraExperiment final : public QZExperiment, public QZTeardown {
 
   QZDescription experimentDescription() const override;
   // Parameters, all optional: "duration" of the stream in seconds, 3; "camera", its position among the device's
-  // streams, 0; "frameRate" to ask for, per second, 30; "formatIndex", by default the one that the camera has. Fails
+  // streams, 0; "frameRate" to ask for, per second, 30; "formatIndex", 0. Fails
   // with QZErrorDomain code 5 if one is out of range.
   bool setupWithParameters(const Dictionary& parameters, QZDiagnosticHost* host, DiagnosticErrorPtr* error) override;
   // Blocks for the duration. Fails with the codes above.
@@ -53,7 +53,7 @@ class QZSingleCameraExperiment final : public QZExperiment, public QZTeardown {
   double duration_ = 3;    // seconds
   double frameRate_ = 30;  // per second
   std::uint64_t camera_ = 0;
-  std::optional<std::int64_t> formatIndex_;
+  std::uint64_t formatIndex_ = 0;
   std::shared_ptr<CaptureDevice> device_;
   std::shared_ptr<CaptureStream> stream_;
 };

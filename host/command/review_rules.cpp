@@ -53,13 +53,14 @@ std::string listed(const std::vector<std::string>& names) {
 // Units by the symbols of the International System, and the counts that diagnostics use.
 bool isKnownUnit(const std::string& symbol) {
   static const std::set<std::string_view> known = {
-      "frames", "errors",   "events", "images", "pixels", "px",   "bytes", "B",   "kB",   "MB",   "samples", "counts",
-      "s",      "ms",       "us",     "µs",     "ns",     "min",  "h",     "Hz",  "kHz",  "MHz",  "GHz",     "fps",
-      "V",      "mV",       "uV",     "µV",     "A",      "mA",   "uA",    "µA",  "W",    "mW",   "uW",      "µW",
-      "Ohm",    "Ω",        "kΩ",     "F",      "nF",     "pF",   "J",     "mJ",  "K",    "°C",   "degC",    "C",
-      "m",      "cm",       "mm",     "um",     "µm",     "nm",   "g",     "kg",  "N",    "Pa",   "hPa",     "kPa",
-      "T",      "mT",       "uT",     "µT",     "lux",    "lx",   "lm",    "cd",  "dB",   "deg",  "°",       "rad",
-      "%",      "permille", "‰",      "ppm",    "bit",    "bits", "LSB",   "m/s", "m/s2", "m/s²", "rad/s",   "1"};
+      "frames",  "frames/s", "errors", "events", "images", "pixels", "px",    "bytes", "B",        "kB", "MB",
+      "samples", "counts",   "s",      "ms",     "us",     "µs",     "ns",    "min",   "h",        "Hz", "kHz",
+      "MHz",     "GHz",      "fps",    "V",      "mV",     "uV",     "µV",    "A",     "mA",       "uA", "µA",
+      "W",       "mW",       "uW",     "µW",     "Ohm",    "Ω",      "kΩ",    "F",     "nF",       "pF", "J",
+      "mJ",      "K",        "°C",     "degC",   "C",      "m",      "cm",    "mm",    "um",       "µm", "nm",
+      "g",       "kg",       "N",      "Pa",     "hPa",    "kPa",    "T",     "mT",    "uT",       "µT", "lux",
+      "lx",      "lm",       "cd",     "dB",     "deg",    "°",      "rad",   "%",     "permille", "‰",  "ppm",
+      "bit",     "bits",     "LSB",    "m/s",    "m/s2",   "m/s²",   "rad/s", "1"};
   return known.contains(symbol);
 }
 

@@ -1,6 +1,7 @@
 // The camera experiments with the binding that the probe writes, on cameras whose formats differ from each other.
 #include "backends/linux/counters/counter_system_for_tests.h"
 #include "backends/linux/probe/probe.h"
+#include "diagnostics/single_camera/single_camera_experiment.h"
 #include "tests/sweeps/linux_cameras.h"
 
 #include <filesystem>
@@ -27,7 +28,8 @@ class ProbedCamerasTest : public testing::Test {
     for (int i = 0; i < 5; ++i) kernel_->add(i, webcam(i));
   }
 
-  Outcome run(const std::vector<std::string>& ports, Array formats) {
+  // A platform with the binding that the probe writes.
+  Platform probedPlatform() {
     const std::filesystem::path file = kernel_->roots().sysfs.parent_path() / "binding.json";
     std::ofstream(file)
         << probeMachine({kernel_, kernel_->roots(), {}, std::make_shared<FakeCounters>(), file}).binding;
@@ -35,7 +37,11 @@ class ProbedCamerasTest : public testing::Test {
     platform.capture = makeLinuxCapture(readBinding(file), kernel_, kernel_->roots());
     platform.clock = std::make_shared<FakeClock>(kernel_);
     platform.concurrency = std::make_shared<ThreadConcurrency>();
-    QZCameraSyncExperiment experiment(ports, std::move(formats), 30, platform);
+    return platform;
+  }
+
+  Outcome run(const std::vector<std::string>& ports, Array formats) {
+    QZCameraSyncExperiment experiment(ports, std::move(formats), 30, probedPlatform());
     return outcomeOf(experiment, Dictionary{{"duration", 2.99}});
   }
 
@@ -59,6 +65,18 @@ TEST_F(ProbedCamerasTest, TheFrontCamerasRunAsTheyWereProbed) {
   for (const auto& [name, measurement] : outcome.result->measurements()) {
     if (name.ends_with(".Frames")) EXPECT_EQ(measurement.value(), 90) << name;
   }
+  EXPECT_TRUE(kernel_->isIdle());
+}
+
+TEST_F(ProbedCamerasTest, OneCameraRunsAsItWasProbed) {
+  QZSingleCameraExperiment experiment(probedPlatform());
+  const Outcome outcome = outcomeOf(experiment, Dictionary{{"duration", 2.99}});
+  ASSERT_NE(outcome.result, nullptr) << outcome.error;
+  EXPECT_EQ(outcome.measured("Frames"), 90);
+  EXPECT_NEAR(outcome.measured("FrameRate"), 30, 0.01);
+  EXPECT_EQ(outcome.measured("MissingFrames"), 0);
+  EXPECT_LT(outcome.measured("SilenceAtEnd"), 40);
+  EXPECT_TRUE(experiment.teardown(nullptr));
   EXPECT_TRUE(kernel_->isIdle());
 }
 

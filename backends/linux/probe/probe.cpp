@@ -3,6 +3,7 @@
 #include "backends/linux/binding/binding.h"
 #include "backends/linux/counters/counter_channels.h"
 #include "backends/linux/display/display_connectors.h"
+#include "backends/linux/probe/probe_absent.h"
 #include "backends/linux/probe/probe_cameras.h"
 #include "backends/linux/system/linux_error.h"
 #include "base/text/hexadecimal.h"
@@ -54,6 +55,7 @@ class Probe {
     tell("Counters");
     probeCounterFiles();
     probeTracepoints();
+    binding_["absent"] = absentDiagnostics(binding_);
     // Names may contain arbitrary bytes; invalid UTF-8 is replaced.
     return {std::move(lines_), binding_.dump(2, ' ', false, Json::error_handler_t::replace) + "\n"};
   }

@@ -7,6 +7,7 @@
 
 #include <gmock/gmock.h>
 #include <gtest/gtest.h>
+#include <nlohmann/json.hpp>
 
 #include <algorithm>
 #include <cerrno>
@@ -14,6 +15,7 @@
 #include <filesystem>
 #include <fstream>
 #include <string>
+#include <vector>
 
 namespace quazor {
 namespace {
@@ -22,6 +24,7 @@ namespace fs = std::filesystem;
 using ::testing::Contains;
 using ::testing::ElementsAre;
 using ::testing::HasSubstr;
+using ::testing::UnorderedElementsAre;
 
 class ProbeTest : public ::testing::Test {
  protected:
@@ -363,6 +366,28 @@ TEST_F(ProbeTest, KeepsToTextWhereADeviceGivesNone) {
   kernel_->add(0, node);
   probe();
   EXPECT_EQ(binding_.cameras.size(), 1U);
+}
+
+// The names of the diagnostics that the suggestion skips.
+std::vector<std::string> absentIn(const std::string& binding) {
+  const auto document = nlohmann::json::parse(binding);
+  std::vector<std::string> names;
+  for (const auto& [name, reason] : document.at("absent").items()) names.push_back(name);
+  return names;
+}
+
+TEST_F(ProbeTest, SkipsTheDiagnosticsWhosePartsAreAbsent) {
+  EXPECT_THAT(absentIn(probe().binding),
+              UnorderedElementsAre("SingleCameraDiagnostic", "CameraSyncDiagnostic.Back", "CameraSyncDiagnostic.Front",
+                                   "TesselFaultDiagnostic", "TesselTelemonDiagnostic"));
+  for (int i = 0; i < 2; ++i) kernel_->add(i, fakeCamera("fake:" + std::to_string(i)));
+  EXPECT_THAT(absentIn(probe().binding), UnorderedElementsAre("CameraSyncDiagnostic.Back", "CameraSyncDiagnostic.Front",
+                                                              "TesselFaultDiagnostic", "TesselTelemonDiagnostic"));
+  kernel_->add(2, fakeCamera("fake:2"));
+  EXPECT_THAT(absentIn(probe().binding),
+              UnorderedElementsAre("CameraSyncDiagnostic.Front", "TesselFaultDiagnostic", "TesselTelemonDiagnostic"));
+  for (int i = 3; i < 5; ++i) kernel_->add(i, fakeCamera("fake:" + std::to_string(i)));
+  EXPECT_THAT(absentIn(probe().binding), UnorderedElementsAre("TesselFaultDiagnostic", "TesselTelemonDiagnostic"));
 }
 
 TEST(ProbeOfTheRunningSystem, CanBeMade) {

@@ -1,0 +1,12 @@
+// The diagnostics that a probed machine cannot run.
+#pragma once
+
+#include <nlohmann/json.hpp>
+
+namespace quazor {
+
+// The entry "absent" for a binding that the probe has written: the installed diagnostics that need a part which it does
+// not bind, by name, each with the reason. Any thread.
+nlohmann::ordered_json absentDiagnostics(const nlohmann::ordered_json& binding);
+
+}  // namespace quazor
