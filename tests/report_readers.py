@@ -89,6 +89,8 @@ def read_json(text):
             "summary": one["summary"],
             "verdict": one["verdict"],
             "skip": skip_of(one),
+            "attempt": one.get("attempt"),
+            "repetition": one.get("repetition"),
             "results": [
                 Result(each["name"], number(each["value"]), each["unit"], limit_of(each["limit"]), each["verdict"])
                 for each in one.get("measuredResults", [])],
@@ -160,6 +162,8 @@ def read_ocp(stream):
         "results": ocp_results(stream),
         "measurements": [(one["name"][len("raw."):], number(one["value"]), one.get("unit", "")) for one in raw],
         "skip": skip_of(stream.start["metadata"]),
+        "attempt": stream.start["metadata"].get("attempt"),
+        "repetition": stream.start["metadata"].get("repetition"),
         "errors": [split_symptom(one) for one in stream.all_of("error")],
         "log": [(levels[one["severity"]], one["message"]) for one in stream.all_of("log")],
         "parameters": {half: {name: number(value) for name, value in parameters.get(half, {}).items()}
@@ -232,6 +236,22 @@ def junit_log(suite):
     return [(level, message) for _, level, message in lines]
 
 
+def whole(text):
+    return None if text is None else int(text)
+
+
+def read_superseded(suite):
+    """An error that was accepted: one test case, which is skipped."""
+    it = properties_of(suite)
+    case, = suite.findall("testcase")
+    sentence, _, errors = case.find("skipped").get("message").partition("\n")
+    if not sentence.endswith(" ended in an error, which was accepted because a later attempt had none:"):
+        raise ValueError(f"superseded: {sentence}")
+    return {"name": suite.get("name"), "summary": it["summary"], "verdict": it["verdict"], "seed": int(it["seed"]),
+            "attempt": whole(it.get("attempt")), "repetition": whole(it.get("repetition")), "log": junit_log(suite),
+            "error lines": errors, "outcome": derived_verdict(suite)}
+
+
 def read_junit(suite):
     it = properties_of(suite)
     cases = suite.findall("testcase")
@@ -249,6 +269,8 @@ def read_junit(suite):
         "parameters": {half: {key[len(f"parameter.{half}."):]: number(value) for key, value in it.items()
                               if key.startswith(f"parameter.{half}.")} for half in ("experiment", "analysis")},
         "seed": int(it["seed"]),
+        "attempt": whole(it.get("attempt")),
+        "repetition": whole(it.get("repetition")),
         "log": junit_log(suite),
         "junit errors": [],
     }
@@ -294,6 +316,10 @@ def expected_of_junit(record):
         "parameters": {half: {in_xml(name): value for name, value in values.items()}
                        for half, values in record["parameters"].items()},
         "seed": record["seed"],
+        "attempt": record["attempt"],
+        "repetition": record["repetition"],
+        "error lines": in_xml(lines),
+        "outcome": "skip",  # of an error that was accepted
         "log": [(level, in_xml(printable(text))) for level, text in record["log"]],
         "junit errors": errors and [in_xml(f"{errors[0].domain}:{errors[0].code}"), in_xml(errors[0].message),
                                     in_xml(lines)],
@@ -308,7 +334,7 @@ def csv_rows(content):
     return [[re.sub(r"^'('*[=+\-@\t\r])", r"\1", cell) for cell in row] for row in rows]  # protected from spreadsheets
 
 
-def read_csv(rows):
+def read_csv(rows, header):
     """Converts a diagnostic's lines to a record."""
     if any(row[:2] != rows[0][:2] or row[11:] != rows[0][11:] for row in rows):
         raise ValueError("lines of one diagnostic differ in what they say of it")
@@ -323,16 +349,18 @@ def read_csv(rows):
         results.append(Result(it["result"], number(it["value"]), it["unit"], Limit(it["limit"], *bounds),
                               it["resultVerdict"]))
     errors = [Error(first["errorDomain"], int(first["errorCode"]), first["errorMessage"])] if first["errorCode"] else []
-    more = rows[0][len(CSV_HEADER):]
+    more = dict(zip(header[len(CSV_HEADER):], rows[0][len(CSV_HEADER):]))
+    skip = (more.get("skipKind"), more.get("skipReason"))
     return {"name": first["diagnostic"], "verdict": first["verdict"], "results": results, "errors": errors,
-            "error stage": first["errorStage"], "skip": tuple(more) if any(more) else None}
+            "error stage": first["errorStage"], "skip": skip if any(skip) else None,
+            "attempt": whole(more.get("attempt") or None), "repetition": whole(more.get("repetition") or None)}
 
 
 def expected_of_csv(record):
     """No limit looks like a limit without name and bounds, and there is only one error."""
     results = [one._replace(limit=one.limit or NO_LIMIT) for one in record["results"]]
     return {"name": record["name"], "verdict": record["verdict"], "results": results, "errors": record["errors"][:1],
-            "skip": record["skip"]}
+            "skip": record["skip"], "attempt": record["attempt"], "repetition": record["repetition"]}
 
 
 def read_experiment_csv(rows):
@@ -453,5 +481,6 @@ def expected_of_text(record, of_experiments):
         if of_experiments else [],
         "auxiliaryData": of_experiments and record["auxiliaryData"],
         "verdict": record["verdict"],
-        "errors": error_lines(record["errors"], "    ") or skip_lines(record["skip"]),
+        "errors": ([f"    {record['trial']}"] if record["trial"] else []) +
+                  (error_lines(record["errors"], "    ") or skip_lines(record["skip"])),
     }

@@ -134,15 +134,33 @@ class Generator {
       sample.run.tags.set(oneIn(2) ? "serial" : std::to_string(i) + std::string(oneOf(kWords)),
                           std::string(oneOf(kWords)));
     }
-    for (std::size_t i = upTo(4); i > 0; --i) {
-      sample.records.push_back(sample.run.ofExperiments ? experiment() : diagnostic());
-      sample.run.names.push_back(sample.records.back().name);
+    if (oneIn(4)) sample.run.attempts = 2 + upTo(2);
+    if (oneIn(4)) sample.run.repetitions = 2 + upTo(2);
+    sample.run.acceptFlaky = sample.run.attempts > 0 && oneIn(2);
+    for (std::size_t i = upTo(4); i > 0; --i) sample.run.names.push_back(text());
+    const std::size_t rounds = std::max<std::size_t>(sample.run.repetitions, 1);
+    for (std::size_t round = 1; round <= rounds; ++round) {
+      for (const std::string& name : sample.run.names) addAttempts(sample, name, round);
     }
     if (oneIn(5)) interrupt(sample);
     return sample;
   }
 
  private:
+  // The entries of a diagnostic in one repetition.
+  void addAttempts(Sample& sample, const std::string& name, std::size_t round) {
+    const RunStarted& run = sample.run;
+    const std::size_t attempts = std::max<std::size_t>(run.attempts, 1);
+    for (std::size_t attempt = 1; attempt <= attempts; ++attempt) {
+      DiagnosticRecord record = run.ofExperiments ? experiment() : diagnostic();
+      if (attempt > 1 && record.skip) continue;
+      record.name = name;
+      record.trial = {run.attempts == 0 ? 0 : attempt, run.attempts, run.repetitions == 0 ? 0 : round, run.repetitions};
+      sample.records.push_back(std::move(record));
+      if (sample.records.back().verdict != Verdict::kError) return;
+    }
+  }
+
   // A random number from 0 to `most`.
   std::size_t upTo(std::size_t most) { return static_cast<std::size_t>(random_() % (most + 1)); }
   bool oneIn(std::size_t count) { return upTo(count - 1) == 0; }

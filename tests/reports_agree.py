@@ -10,8 +10,10 @@ formats agree; 1: they do not, or a kind of run was missing from the samples.
 
 import collections
 import json
+import math
 import os
 import pathlib
+import statistics
 import subprocess
 import sys
 import tempfile
@@ -30,20 +32,44 @@ SIGNS = ("]]>", "\ufffd", "\uffff", "\\u0000", "\\r", "\u2028", ",")  # as in JS
 # The samples must contain some of each.
 KINDS = {"a diagnostic: pass", "a diagnostic: fail", "a diagnostic: error", "a diagnostic: skip", "an experiment: pass",
          "an experiment: error", "an experiment: skip", "a skip: no-such-hardware", "a skip: not-allowed",
-         "a skip: not-reached", "a run with tags", "a run with a serial number", "an interrupted run without a record", "an interrupted run with a record", "a run that never began",
+         "a skip: not-reached", "a run with tags", "a run with a serial number", "a run with repetitions", "a flaky diagnostic",
+         "an error that was accepted", "a result that varied", "an interrupted run without a record", "an interrupted run with a record", "a run that never began",
          "no results", "many results", "a deep error", "a value that is not finite", "a limit without bounds",
          "a result: pass", "a result: fail", "a result: error", "a result: none", *(f"a text with {sign!r}" for sign in SIGNS)}
 
 
+def trial_text(record, run):
+    """Which attempt and repetition it was, as people read it."""
+    parts = []
+    if record["repetition"]:
+        parts.append(f"repetition {record['repetition']} of {run['repetitions']}")
+    if record["attempt"] and (record["attempt"] > 1 or record["verdict"] == "error"):
+        passed = "pass in " if record["verdict"] == "pass" else ""
+        parts.append(f"{passed}attempt {record['attempt']} of {run['attempts']}")
+    return ", ".join(parts)
+
+
+def last_attempts(records):
+    """The entries after which there is no other attempt."""
+    return [one for one, after in zip(records, [*records[1:], None])
+            if after is None or (after["attempt"] or 1) == 1]
+
+
+def outcome_of(record):
+    return "flaky" if record["verdict"] == "pass" and (record["attempt"] or 1) > 1 else record["verdict"]
+
+
 def counts_line(records, of_experiments):
-    count = collections.Counter(one["verdict"] for one in records)
-    many = "" if len(records) == 1 else "s"
-    skipped = f", {count['skip']} skipped" if count["skip"] else ""
+    ended = last_attempts(records)
+    count = collections.Counter(outcome_of(one) for one in ended)
+    many = "" if len(ended) == 1 else "s"
+    noun = "run" if any(one["repetition"] for one in records) else "experiment" if of_experiments else "diagnostic"
+    more = "".join(f", {count[key]} {word}" for key, word in (("skip", "skipped"), ("flaky", "flaky")) if count[key])
     if of_experiments:
-        return (f"{len(records)} experiment{many}: {count['pass']} returned a result, "
-                f"{count['error']} ended in an error{skipped}")
-    return (f"{len(records)} diagnostic{many}: {count['pass']} passed, {count['fail']} failed, "
-            f"{count['error']} ended in an error{skipped}")
+        return (f"{len(ended)} {noun}{many}: {count['pass']} returned a result, "
+                f"{count['error']} ended in an error{more}")
+    return (f"{len(ended)} {noun}{many}: {count['pass']} passed, {count['fail']} failed, "
+            f"{count['error']} ended in an error{more}")
 
 
 def failure_line(record):
@@ -55,19 +81,47 @@ def failure_line(record):
     else:
         names = list(dict.fromkeys(one.name for one in record["results"] if one.verdict == "fail"))
         what = ", ".join(names[:3]) + (f" and {len(names) - 3} more" if len(names) > 3 else "")
-    word = {"fail": "FAIL ", "error": "ERROR", "skip": "SKIP "}[record["verdict"]]
+    word = {"fail": "FAIL ", "error": "ERROR", "skip": "SKIP ", "pass": "FLAKY"}[record["verdict"]]
     name = report_readers.printable(record["name"])
     return f"{word} {name}: {report_readers.printable(what)}" if what else f"{word} {name}"
 
 
-def text_end(records, of_experiments, interrupted):
-    """The lines after the records of a text."""
+def failure_lines(records):
+    """The lines of what did not pass, or only after an error. The repetitions that ended alike share one."""
+    lines = []  # [text, trial, times]
+    before = None
+    for record in records:
+        last = any(one is record for one in last_attempts(records))
+        if last and outcome_of(record) != "pass":
+            shown = record | {"errors": before["errors"]} if outcome_of(record) == "flaky" else record
+            text = failure_line(shown)
+            same = [one for one in lines if one[0] == text and record["repetition"]]
+            if same:
+                same[0][2] += 1
+            else:
+                lines.append([text, record["trial"], 1])
+        before = record
+    for text, trial, times in lines:
+        yield text + (f" ({times} times, first in {trial})" if times > 1 else f" ({trial})" if trial else "")
+
+
+def text_end(records, of_experiments, interrupted, run):
+    """The lines after the records of a text and after the table of what varied."""
     if len(records) != 1 or interrupted is not None:
         yield counts_line(records, of_experiments)
+    if any(outcome_of(one) == "flaky" for one in last_attempts(records)) and not run.get("acceptFlaky"):
+        yield "A pass after an error counts as an error, unless --accept-flaky is given."
     if not of_experiments:
-        yield from (failure_line(one) for one in records if one["verdict"] != "pass")
+        yield from failure_lines(records)
     if interrupted:
         yield f"Interrupted while {report_readers.printable(interrupted)} was running."
+
+
+def run_verdict(records, accepts_flaky):
+    """The verdict of a run, from its last attempts."""
+    verdicts = {"error" if one["verdict"] in ("pass", "fail") and (one["attempt"] or 1) > 1 and not accepts_flaky
+                else one["verdict"] for one in last_attempts(records)}
+    return next((one for one in ("error", "fail", "skip") if one in verdicts), "pass")
 
 
 class Comparison:
@@ -98,7 +152,11 @@ class Comparison:
     def compare(self, name, reports):
         """`reports` contains the reports of one run by format, as bytes."""
         of_experiments, records, interrupted = report_readers.read_json(reports["json"].decode("utf-8"))
+        run = json.loads(reports["json"])["run"]
+        for record in records:
+            record["trial"] = trial_text(record, run)
         self.count_kinds(of_experiments, records)
+        self.check_verdict(name, json.loads(reports["json"]), records)
         streams = ocp_rules.streams_of(reports["ocp"], f"{name} ocp", self.found)
         root = xml.etree.ElementTree.fromstring(reports["junit"])
         suites = root.findall("testsuite")
@@ -106,16 +164,57 @@ class Comparison:
         for place, (record, stream, suite) in enumerate(zip(records, streams, suites)):
             where = f"{name} {place}"
             self.check_record(f"{where} ocp", report_readers.read_ocp(stream), report_readers.expected_of_ocp(record))
-            junit = report_readers.read_junit(suite)
+            accepted = run.get("acceptFlaky") and self.is_superseded(records, place)
+            self.kinds["an error that was accepted"] += bool(accepted)
+            junit = report_readers.read_superseded(suite) if accepted else report_readers.read_junit(suite)
             self.check_record(f"{where} junit", blurred(junit), blurred(report_readers.expected_of_junit(record)))
             self.check(f"{where}: begin", suite.get("timestamp"), stream.begin)
-            record["error stage"] = junit.get("error stage", "")
+            record["error stage"] = None if accepted else junit.get("error stage", "")
         self.check_unrecorded(name, streams[len(records):], suites[len(records):], records, interrupted)
         identity = json.loads(reports["json"])["run"]
         self.check_identity(name, identity, streams, suites)
         rows = self.without_identity(name, report_readers.csv_rows(reports["csv"]), identity)
         self.compare_csv(name, rows, of_experiments, records)
-        self.compare_text(name, report_readers.Lines(reports["text"]), of_experiments, records, interrupted)
+        self.compare_text(name, report_readers.Lines(reports["text"]), of_experiments, records, interrupted, run)
+
+    @staticmethod
+    def is_superseded(records, place):
+        """True for an error with a later attempt, the last of which passed or failed."""
+        last = next(at for at in range(place, len(records))
+                    if at + 1 == len(records) or (records[at + 1]["attempt"] or 1) == 1)
+        return last > place and records[last]["verdict"] in ("pass", "fail")
+
+    def check_verdict(self, name, document, records):
+        run = document["run"]
+        expected = run_verdict(records, run.get("acceptFlaky")) if "attempts" in run or "repetitions" in run else None
+        self.check(f"{name} json: verdict", document.get("verdict"), expected)
+        counts = {}
+        for record in last_attempts(records):
+            if record["repetition"]:
+                of_one = counts.setdefault(record["name"], dict.fromkeys(("pass", "flaky", "fail", "error", "skip"), 0))
+                of_one[outcome_of(record)] += 1
+        found = [(one["name"], one["verdicts"]) for one in document.get("variation", [])]
+        self.check(f"{name} json: variation", found, list(counts.items()))
+        self.kinds["a run with repetitions"] += bool(counts)
+        self.kinds["a flaky diagnostic"] += sum(outcome_of(one) == "flaky" for one in records)
+        for one in document.get("variation", []):
+            self.check_values(f"{name} json: variation of {one['name']}", one, records)
+
+    def check_values(self, where, variation, records):
+        """Compares what is said of each name that occurs once in every entry."""
+        entries = [one["results"] or [report_readers.Result(*each, None, "none") for each in one["measurements"]]
+                   for one in records if one["name"] == variation["name"] and one["repetition"] and not one["errors"]]
+        names = collections.Counter(each.name for entry in entries for each in entry)
+        for one in variation["varying"]:
+            values = [float(each.value) for entry in entries for each in entry if each.name == one["name"]]
+            if one["values"] != names[one["name"]]:
+                continue  # several of this name, or other units
+            finite = sorted(value for value in values if math.isfinite(value))
+            expected = [min(finite), statistics.median(finite), max(finite)] if finite else [math.nan] * 3
+            got = [float(one[key]) for key in ("minimum", "median", "maximum")]
+            same = all(a == b or (math.isnan(a) and math.isnan(b)) or math.isinf(b) for a, b in zip(got, expected))
+            self.check(f"{where}: {one['name']}: {got} and {expected}", same, True)
+            self.kinds["a result that varied"] += 1
 
     def check_identity(self, name, run, streams, suites):
         self.kinds["a run with tags"] += len(run["tags"]) > 1
@@ -165,22 +264,27 @@ class Comparison:
             self.check(f"{name} csv", report_readers.read_experiment_csv(rows), expected)
             return
         of_skips = ["skipKind", "skipReason"] if any(one["skip"] for one in records) else []
-        self.check(f"{name} csv: header", rows.pop(0), [*report_readers.CSV_HEADER, *of_skips])
+        trials = [key for key in ("attempt", "repetition") if any(one[key] for one in records)]
+        header = rows.pop(0)
+        self.check(f"{name} csv: header", header, [*report_readers.CSV_HEADER, *of_skips, *trials])
         for place, record in enumerate(records):
             count = max(1, len(record["results"]))
-            got = report_readers.read_csv(rows[:count])
+            got = report_readers.read_csv(rows[:count], header)
             self.check_record(f"{name} {place} csv", got, report_readers.expected_of_csv(record))
-            self.check(f"{name} {place} csv: stage", got["error stage"], record["error stage"])
+            if record["error stage"] is not None:
+                self.check(f"{name} {place} csv: stage", got["error stage"], record["error stage"])
             del rows[:count]
         self.check(f"{name} csv: lines left", rows, [])
 
-    def compare_text(self, name, lines, of_experiments, records, interrupted):
+    def compare_text(self, name, lines, of_experiments, records, interrupted, run):
         for place, record in enumerate(records):
             expected = report_readers.expected_of_text(record, of_experiments)
             got = report_readers.read_text(lines, expected)
             self.check_record(f"{name} {place} text", blurred(got), blurred(expected))
+        if any(one["repetition"] for one in records):
+            self.check(f"{name} text: variation", lines.block()[0], b"What varied between the repetitions:")
         left = [line.decode("utf-8", "replace") for line in lines.rest()]
-        expected = [*text_end(records, of_experiments, interrupted), ""]
+        expected = [*text_end(records, of_experiments, interrupted, run), ""]
         self.check(f"{name} text: end", blurred(left), blurred(expected))
 
     def count_kinds(self, of_experiments, records):

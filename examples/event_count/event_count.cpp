@@ -15,7 +15,7 @@ using namespace quazor;
 // The report channel, as `EventCountExperiment` finds it.
 constexpr std::string_view kGroup = "Backlight";
 constexpr std::string_view kChannel = "Level changes";
-constexpr std::string_view kTotal = "Total";
+constexpr std::string_view kTotal = "EventCount.Total";
 constexpr double kUsualMaximum = 100;
 
 constexpr int kBadParameterValue = 5;   // of QZErrorDomain, shared by all plug-ins
