@@ -316,9 +316,13 @@ TEST_F(ProbeTest, NamesTheRuleForAHidDeviceThatThisUserMayNotOpen) {
   tree.openToAll();
   fs::permissions(tree.path("hidraw0"), fs::perms::none);
   const uid_t user = ::geteuid();
-  if (user == 0) ASSERT_EQ(::seteuid(65534), 0) << "root may open everything";
+  if (user == 0) {  // root may open everything
+    ASSERT_EQ(::seteuid(65534), 0);
+  }
   const std::vector<std::string> told = probeMachine({kernel_, kernel_->roots(), hid_, counters_, folder_}).lines;
-  if (user == 0) ASSERT_EQ(::seteuid(0), 0);
+  if (user == 0) {
+    ASSERT_EQ(::seteuid(0), 0);
+  }
   EXPECT_THAT(told, Contains("    unsuitable: Permission denied"));
   EXPECT_THAT(told, Contains("    docs/linux.md has a udev rule that assigns it to a group."));
 }
