@@ -9,6 +9,7 @@
 
 #include <langinfo.h>
 #include <locale.h>
+#include <poll.h>
 #include <unistd.h>
 
 #include <cstdlib>
@@ -38,6 +39,12 @@ bool writesUtf8() {
   return utf8;
 }
 
+// True if standard error is ready for as much as a pipe takes at once.
+bool errTakesText() {
+  pollfd error{STDERR_FILENO, POLLOUT, 0};
+  return poll(&error, 1, 0) == 1 && (error.revents & POLLOUT) != 0;
+}
+
 }  // namespace
 
 int main(int argc, char** argv) {
@@ -53,7 +60,7 @@ int main(int argc, char** argv) {
     std::ostream& out = terminalOut ? *terminalOut : std::cout;
     std::ostream& err = terminalErr ? *terminalErr : std::cerr;
     err.tie(&out);
-    quazor::Console console{out, err, wantsColour(), terminalErr.has_value(), utf8};
+    quazor::Console console{out, err, wantsColour(), terminalErr.has_value(), utf8, errTakesText};
     const std::vector<std::string> arguments(argv + (argc > 0 ? 1 : 0), argv + argc);
     return static_cast<int>(quazor::runProgram(arguments, quazor::Installation::ofThisProgram(), console));
   } catch (const std::exception& exception) {

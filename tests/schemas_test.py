@@ -34,6 +34,7 @@ RUNS = (
      "--log-level", "debug"],
     ["run", "CameraSyncDiagnostic.*", "--phone", "camera_sync/start_refused_on_first", "--limit", "Nothing > 1"],
     ["run", "CameraSyncDiagnostic.Back", "--limit", "*.Total in [90, 90]"],
+    ["run", "CameraSyncDiagnostic.Back", "--realtime", "--set", "duration=2", "--heartbeat", "1"],
     ["experiment", "--all"],
     ["run", "CameraSyncDiagnostic.*", *MANY, "--skip", "CameraSyncDiagnostic.Front=x"],
     ["run", "TesselFaultDiagnostic", "--repeat", "4", "--phone", "camera_sync/frames_dropped"],

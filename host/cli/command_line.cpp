@@ -3,6 +3,7 @@
 #include "base/text/nearest_name.h"
 #include "contract/contract.h"
 #include "host/cli/help_texts.h"
+#include "host/cli/option_checks.h"
 #include "host/cli/option_values.h"
 #include "host/device/phone.h"
 #include "host/text/table.h"
@@ -40,6 +41,8 @@ struct RawOptions {
   std::string seeds = "3";
   std::string memory;
   std::string grace;
+  std::string heartbeat = "30";
+  std::string what;
   std::string logLevel;
   std::string logLimit;
   std::string format = "text";
@@ -136,6 +139,15 @@ void addGrace(CLI::App& command, RawOptions& raw) {
       ->type_name("SECONDS");
 }
 
+void addHeartbeat(CLI::App& command, RawOptions& raw) {
+  command
+      .add_option(
+          "--heartbeat", raw.heartbeat,
+          "How often a run says on standard error that it goes on, unless that is a terminal, and in its record; "
+          "0 for never. Default 30")
+      ->type_name("SECONDS");
+}
+
 void addParameterOptions(CLI::App& command, RawOptions& raw) {
   command
       .add_option(
@@ -215,15 +227,6 @@ void addRecords(CLI::App& command, RawOptions& raw, int least, int most, const s
   command.add_option("RECORD", raw.records, what)->type_name("")->required()->expected(least, most);
 }
 
-// CLI11 accepts an empty option value; quazor does not.
-void refuseEmpty(const CLI::App& command, const char* option) {
-  const CLI::Option* const given = command.get_option_no_throw(option);
-  if (given == nullptr) return;
-  const std::vector<std::string>& texts = given->results();
-  if (std::find(texts.begin(), texts.end(), std::string()) == texts.end()) return;
-  throw CommandError(ExitCode::kUsage, std::string(option) + ": the value is empty");
-}
-
 Command commandOf(const std::string& name) {
   const auto found = std::find(std::begin(kCommandNames), std::end(kCommandNames), name);
   return static_cast<Command>(found - std::begin(kCommandNames));
@@ -250,43 +253,28 @@ ReportOptions reportOf(const RawOptions& raw, bool isOfRun) {
   return report;
 }
 
-// --seed and --realtime have no effect on a real machine, so they are rejected there.
-void checkPhone(const CLI::App& command, const std::filesystem::path& phone) {
-  const std::optional<std::filesystem::path> binding = bindingNamed(phone);
-  if (!binding) return;
-  if (binding->empty())
-    throw CommandError(ExitCode::kUsage, "--phone 'linux:': the name or file of the binding is missing");
-  for (const char* option : {"--seed", "--realtime"}) {
-    if (command.get_option(option)->count() == 0) continue;
-    throw CommandError(ExitCode::kUsage, std::string(option) + " applies only to simulated phones; --phone '" +
-                                             phone.string() + "' is this machine, which always runs in real time");
+// "list" and the phones to list, or "probe".
+std::vector<std::string> namesOfPhoneCommand(const CLI::App& command, const RawOptions& raw) {
+  if (raw.what == "probe" && !raw.names.empty())
+    throw CommandError(ExitCode::kUsage, "'quazor phone probe' takes no name, but got '" + raw.names.front() + "'");
+  if (raw.what == "probe" && command.get_option("--format")->count() > 0) {
+    throw CommandError(ExitCode::kUsage, "--format applies only to 'quazor phone list'; a binding is JSON");
   }
-}
-
-// Exactly one of names, --all and --only failed must be present.
-void checkNames(const Options& options, const std::string& what) {
-  const int ways = (options.names.empty() ? 0 : 1) + (options.all ? 1 : 0) + (options.onlyFailed ? 1 : 0);
-  if (ways == 0) {
-    throw CommandError(ExitCode::kUsage,
-                       "name the " + what + " to run, or use --all; 'quazor list' shows what is available");
-  }
-  if (ways > 1 && !options.onlyFailed)
-    throw CommandError(ExitCode::kUsage, "use either names of " + what + " or --all, not both");
-  if (ways > 1) throw CommandError(ExitCode::kUsage, "--only failed cannot be combined with names or --all");
-  if (!options.onlyFailed && !options.failedOf.empty()) {
-    throw CommandError(ExitCode::kUsage, "--of requires --only failed");
-  }
+  std::vector<std::string> names = raw.names;
+  names.insert(names.begin(), raw.what);
+  return names;
 }
 
 Options optionsOf(const CLI::App& command, const RawOptions& raw) {
   for (const char* option :
        {"--plugin", "--output", "--profile", "--parameters", "--phone", "--record", "--of", "RECORD", "--memory",
-        "--log-limit", "--grace", "--settle", "--except", "--skip", "--attempts", "--repeat"}) {
+        "--log-limit", "--grace", "--heartbeat", "--settle", "--except", "--skip", "--attempts", "--repeat"}) {
     refuseEmpty(command, option);
   }
   Options options;
   options.command = commandOf(command.get_name());
   options.names = raw.names;
+  if (options.command == Command::kPhone) options.names = namesOfPhoneCommand(command, raw);
   options.all = raw.all;
   options.plugins.assign(raw.plugins.begin(), raw.plugins.end());
   options.parameterFiles.assign(raw.parameterFiles.begin(), raw.parameterFiles.end());
@@ -308,6 +296,7 @@ Options optionsOf(const CLI::App& command, const RawOptions& raw) {
   for (const std::string& text : raw.limits) options.limits.push_back(limitOfCommandLine(text));
   for (const std::string& text : raw.deadlines) options.deadlines.push_back(parseDeadline(text));
   if (!raw.grace.empty()) options.grace = parseGrace(raw.grace);
+  if (command.get_option_no_throw("--heartbeat") != nullptr) options.heartbeat = parseHeartbeat(raw.heartbeat);
   options.logLevel = logLevelOf(raw.logLevel);
   options.logLimit = logLimitOf(raw.logLimit);
   options.systemLog = raw.systemLog;
@@ -379,6 +368,7 @@ void declareRunningCommands(CLI::App& app, RawOptions& raw) {
     addReportOptions(*command, raw, formats);
     addParameterOptions(*command, raw);
     addProcessOptions(*command, raw);
+    addHeartbeat(*command, raw);
     addTags(*command, raw);
   }
   for (CLI::App* const command : {&run, &analyze}) {
@@ -415,9 +405,13 @@ void declareOtherCommands(CLI::App& app, RawOptions& raw) {
   addProcessOptions(selftest, raw);
   addGrace(selftest, raw);
   CLI::App& phone =
-      *app.add_subcommand("phone", "Find the devices of this machine and print a starter binding for them");
-  phone.add_option("WHAT", raw.names, "probe")->type_name("")->required()->expected(1)->check(CLI::IsMember({"probe"}));
-  addRepeatable(phone, "--output", raw.outputs, "Write the binding to this file instead of printing it", "FILE");
+      *app.add_subcommand("phone", "List the simulated phones, or find this machine's devices for a binding");
+  phone.add_option("WHAT", raw.what, "list: the simulated phones that --phone accepts; probe: this machine's devices")
+      ->type_name("list|probe")
+      ->required()
+      ->check(CLI::IsMember({"list", "probe"}));
+  phone.add_option("PHONE", raw.names, "list: a phone's name, or a pattern (*, ?, [...]) for several")->type_name("");
+  addReportOptions(phone, raw, {"text", "json"});
   CLI::App& completion = *app.add_subcommand("completion", "Print the completion script for bash or zsh");
   completion.add_option("SHELL", raw.names, "bash or zsh")
       ->type_name("")

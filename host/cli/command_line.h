@@ -45,7 +45,7 @@ inline constexpr std::string_view kCommandNames[] = {"list",    "describe",   "r
 
 // A parsed command line. Options that the command does not have keep their defaults.
 struct Options {
-  // Positional arguments: diagnostics or experiments, topics, a shell, "probe", a folder.
+  // Positional arguments: diagnostics or experiments, topics, a shell, "probe", "list" and phones, a folder.
   std::vector<std::string> names;
   std::vector<std::filesystem::path> plugins;  // empty: those in the folders of plug-ins
   std::vector<ParameterOverride> settings;
@@ -62,7 +62,8 @@ struct Options {
   ReportOptions report;
   std::vector<DeadlineSetting> deadlines;
   std::chrono::nanoseconds grace = kDefaultGrace;
-  std::optional<std::uint64_t> memory;  // limit of a plug-in process, in bytes; nothing: no limit
+  std::chrono::nanoseconds heartbeat{};  // zero: none
+  std::optional<std::uint64_t> memory;   // limit of a plug-in process, in bytes; nothing: no limit
   std::uint64_t seed = 0;
   std::uint64_t seeds = 0;  // the number of seeds, starting at 0
   std::optional<LogLevel> logLevel;

@@ -22,6 +22,7 @@ constexpr Example kExamples[] = {
     {"quazor run --all", "run every diagnostic on the healthy simulated phone"},
     {"quazor run CameraSyncDiagnostic.Back --set duration=10"},
     {"quazor run --all --phone my_phone.json --format json --output report.json"},
+    {"quazor phone list 'camera_sync/*'", "the simulated phones of that name"},
     {"quazor phone probe", "find this machine's devices and print a starter binding"},
     {"quazor run --all --phone linux:board.json", "run on this machine's own cameras, sensors and counters"},
     {"quazor run --all --limit '*.Total >= 90'", "also judge by a limit of your own"},
@@ -56,10 +57,10 @@ constexpr ExitCodeHelp kExitCodes[] = {
     {3, "a record is incomplete, because its run did not end", "verify"},
     {64, "the command line is invalid", {}},
     {66, "a plug-in, scenario, binding, profile or record cannot be read or loaded",
-     "list describe run experiment verify analyze diff explain doctor selftest new"},
+     "list describe run experiment verify analyze diff explain doctor selftest phone new"},
     {70, "quazor itself failed", {}},
     {73, "a report or record cannot be written, or the record exists already", {}},
-    {130, "interrupted", "list describe run experiment analyze doctor selftest"},
+    {130, "interrupted", "list describe run experiment verify analyze doctor selftest"},
 };
 
 bool hasWord(std::string_view words, std::string_view word) {

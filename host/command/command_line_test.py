@@ -274,7 +274,8 @@ class RunTest(CommandLineTest):
 
     def test_a_failure_without_an_error_says_so(self):
         result = self.run_fake("--set", "experiment.behaviour=6")
-        self.assertIn("run of FakeExperiment failed without giving an error", result.stdout)
+        self.assertIn("run of FakeExperiment failed without giving an error; the last error line of its log: an error line\n",
+                      result.stdout)
 
     def test_exceptions_stop_at_the_boundary(self):
         for behaviour in (3, 4, 7, 10):

@@ -97,14 +97,14 @@ ExitCode perform(const Options& options, const Installation& installation, Conso
     case Command::kDescribe: return describe(options, installation, console);
     case Command::kRun:
     case Command::kExperiment: return runCommand(options, installation, console, watchSignals(options));
-    case Command::kVerify: return verifyCommand(options, console);
+    case Command::kVerify: return verifyCommand(options, console, watchSignals(options));
     case Command::kAnalyze: return analyzeCommand(options, installation, console, watchSignals(options));
     case Command::kDiff: return diffCommand(options, console);
     case Command::kExplain: return explainErrors(options, installation, console);
     case Command::kDoctor:
       return doctorCommand(options, installation, console, options.plugins.empty() ? nullptr : watchSignals(options));
     case Command::kSelftest: return selftestCommand(options, installation, console, watchSignals(options));
-    case Command::kPhone: return phoneCommand(options, console);
+    case Command::kPhone: return phoneCommand(options, installation, console);
     case Command::kNew: return newCommand(options, installation, console);
     case Command::kCompletion: break;
   }

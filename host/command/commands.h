@@ -27,8 +27,9 @@ ExitCode analyzeCommand(const Options& options, const Installation& installation
 
 // verify: kAllPassed if every verdict in each record follows from the rest of it and its run ended. Otherwise the worst
 // of kCannotRead (no complete line), kFailed (something is wrong) and kIncomplete (the run did not end). A folder
-// stands for the records in it. Throws a CommandError (kCannotRead) if the only record, or a folder, cannot be read.
-ExitCode verifyCommand(const Options& options, Console& console);
+// stands for the records in it. Throws a CommandError (kCannotRead) if the only record, or a folder, cannot be read,
+// and kInterrupted on an interrupt, after the total of the records that are verified. `signals` may be null.
+ExitCode verifyCommand(const Options& options, Console& console, WatchedSignals* signals);
 
 // diff: kAllPassed if two records agree, else kFailed. They agree if the same diagnostics have the same verdicts,
 // parameters, errors, results, limits and measurements; dates, durations and log lines are not compared. Throws a
@@ -49,10 +50,12 @@ ExitCode doctorCommand(const Options& options, const Installation& installation,
 ExitCode selftestCommand(const Options& options, const Installation& installation, Console& console,
                          WatchedSignals* signals);
 
+// phone list: prints the scenarios that --phone accepts by name, or those that the options name. kCannotRead if one of
+// them cannot be read, which is told. Throws a CommandError (kUsage) for a name or pattern that fits none.
 // phone probe: prints the devices of this machine that a binding can use, why each fits or not, and a starter binding,
 // which goes to the output file if there is one. Missing devices are not a failure: kAllPassed. Throws a CommandError
 // (kCannotWrite) if the file cannot be written.
-ExitCode phoneCommand(const Options& options, Console& console);
+ExitCode phoneCommand(const Options& options, const Installation& installation, Console& console);
 
 // new: makes a folder with the project of a plug-in, which is the installed template with the names of the new one.
 // Throws a CommandError, and then leaves nothing behind: kUsage for a name that no plug-in can have, kCannotRead

@@ -97,7 +97,8 @@ class Completer {
     const std::string& command = words_.front();
     if (command == "selftest") return installation_.scenarioNames();
     if (command == "completion") return {"bash", "zsh"};
-    if (command == "phone") return {"probe"};
+    if (command == "phone" && words_.size() == 2) return {"list", "probe"};
+    if (command == "phone") return words_[1] == "list" ? installation_.scenarioNames() : std::vector<std::string>();
     std::vector<std::string> names;
     if (command != "run" && command != "describe" && command != "experiment" && command != "explain" &&
         command != "list") {

@@ -1,13 +1,17 @@
 #include "host/command/commands.h"
 
+#include "contract/message_format.h"
 #include "host/record/record_file.h"
 #include "host/record/record_place.h"
 #include "host/record/verification.h"
+#include "host/report/progress.h"
 #include "host/report/record_difference.h"
 #include "host/text/table.h"
 
 #include <algorithm>
+#include <chrono>
 #include <cstddef>
+#include <cstdint>
 #include <filesystem>
 #include <iterator>
 #include <sstream>
@@ -30,11 +34,58 @@ struct Finding {
 
 std::string problemCount(const Finding& finding) { return countText(finding.problems.size(), "problem"); }
 
-Finding verifyRecord(const std::filesystem::path& file) {
+// Thrown in the middle of a record when the user interrupts. Thread: any.
+struct VerificationInterrupted {};
+
+// Shows on a terminal which record is verified, and ends the verification on an interrupt.
+// Thread: one at a time.
+class VerificationProgress {
+ public:
+  // Both are borrowed; `signals` may be null.
+  VerificationProgress(Console& console, WatchedSignals* signals, std::size_t records)
+      : line_(console.showsProgress ? &console.err : nullptr), signals_(signals), records_(records) {}
+
+  void begin(const std::filesystem::path& file) {
+    ++number_;
+    file_ = file;
+    std::error_code ignored;
+    size_ = std::filesystem::file_size(file, ignored);
+    if (ignored) size_ = 0;
+    update(0);
+  }
+
+  // Throws VerificationInterrupted.
+  void update(std::uint64_t bytes) {
+    if (signals_ != nullptr && signals_->requestsToEnd() > 0) throw VerificationInterrupted();
+    const auto now = std::chrono::steady_clock::now();
+    if (!line_.isShown() || now < nextUpdate_) return;
+    nextUpdate_ = now + std::chrono::milliseconds(100);
+    std::string text = "Verifying";
+    if (records_ > 1) text += formatMessage(" %@ of %@", number_, records_);
+    if (size_ >= kMebibyte) text += formatMessage(" (%@ of %@ MiB)", bytes / kMebibyte, size_ / kMebibyte);
+    line_.show(text + ": " + printable(file_.filename().string()));
+  }
+
+  void erase() { line_.erase(); }
+
+ private:
+  static constexpr std::uint64_t kMebibyte = 1U << 20U;
+
+  StatusLine line_;
+  WatchedSignals* const signals_;
+  const std::size_t records_;
+  std::size_t number_ = 0;
+  std::filesystem::path file_;
+  std::uint64_t size_ = 0;
+  std::chrono::steady_clock::time_point nextUpdate_ = std::chrono::steady_clock::now() + std::chrono::milliseconds(300);
+};
+
+Finding verifyRecord(const std::filesystem::path& file, VerificationProgress& progress) {
   Finding finding;
   StoredRecord stored;
+  progress.begin(file);
   try {
-    stored = readRecord(file);
+    stored = readRecord(file, [&progress](std::uint64_t bytes) { progress.update(bytes); });
   } catch (const RecordDefect& defect) {
     return {ExitCode::kFailed, {}, {}, {defect.what()}};
   }
@@ -55,8 +106,16 @@ Finding verifyRecord(const std::filesystem::path& file) {
   return finding;
 }
 
-ExitCode verifyOne(const std::filesystem::path& file, const Options& options, Console& console) {
-  const Finding finding = verifyRecord(file);
+ExitCode verifyOne(const std::filesystem::path& file, const Options& options, Console& console,
+                   WatchedSignals* signals) {
+  VerificationProgress progress(console, signals, 1);
+  Finding finding;
+  try {
+    finding = verifyRecord(file, progress);
+  } catch (const VerificationInterrupted&) {
+    throw CommandError(ExitCode::kInterrupted, "interrupted before the record was verified");
+  }
+  progress.erase();
   std::string answer;
   for (const std::string& problem : finding.problems) answer += "WRONG  " + printable(problem) + "\n";
   if (!finding.counts.empty()) answer += finding.counts + ", " + problemCount(finding) + "\n";
@@ -86,18 +145,24 @@ std::string lineOf(const std::filesystem::path& file, const Finding& finding, st
   return line;
 }
 
-ExitCode verifyMany(const std::vector<std::filesystem::path>& files, Console& console) {
+ExitCode verifyMany(const std::vector<std::filesystem::path>& files, Console& console, WatchedSignals* signals) {
   Outcome outcomes[] = {{ExitCode::kAllPassed, "OK", "OK"},
                         {ExitCode::kIncomplete, "INCOMPLETE", "incomplete"},
                         {ExitCode::kFailed, "WRONG", "wrong"},
                         {ExitCode::kCannotRead, "UNREADABLE", "unreadable"}};
+  VerificationProgress progress(console, signals, files.size());
+  std::size_t verified = 0;
   for (const std::filesystem::path& file : files) {
     Finding finding;
     try {
-      finding = verifyRecord(file);
+      finding = verifyRecord(file, progress);
     } catch (const CommandError& refusal) {
       finding = {refusal.code(), {}, {}, {refusal.what()}};
+    } catch (const VerificationInterrupted&) {
+      break;
     }
+    ++verified;
+    progress.erase();
     Outcome& outcome = *std::find_if(std::begin(outcomes), std::end(outcomes),
                                      [&finding](const Outcome& one) { return one.code == finding.code; });
     ++outcome.records;
@@ -110,18 +175,23 @@ ExitCode verifyMany(const std::vector<std::filesystem::path>& files, Console& co
     total += (total.empty() ? ": " : ", ") + std::to_string(one.records) + " " + std::string(one.name);
     worst = one.code;
   }
-  console.out << countText(files.size(), "record") << total << '\n' << std::flush;
+  progress.erase();
+  console.out << countText(verified, "record") << total << '\n' << std::flush;
   if (!console.out) throw CommandError(ExitCode::kCannotWrite, "standard output cannot be written");
+  if (verified < files.size()) {
+    throw CommandError(ExitCode::kInterrupted,
+                       formatMessage("interrupted: %@ of %@ records were verified", verified, files.size()));
+  }
   return worst;
 }
 
 }  // namespace
 
-ExitCode verifyCommand(const Options& options, Console& console) {
+ExitCode verifyCommand(const Options& options, Console& console, WatchedSignals* signals) {
   const std::vector<std::filesystem::path>& given = options.records;
   std::error_code ignored;
   const bool isOne = given.size() == 1 && !std::filesystem::is_directory(given.front(), ignored);
-  return isOne ? verifyOne(given.front(), options, console) : verifyMany(recordsIn(given), console);
+  return isOne ? verifyOne(given.front(), options, console, signals) : verifyMany(recordsIn(given), console, signals);
 }
 
 ExitCode diffCommand(const Options& options, Console& console) {

@@ -27,7 +27,7 @@ class RecordCommandsTest : public testing::Test {
     out_.str("");
     Options options;
     options.records = files;
-    return verifyCommand(options, console_);
+    return verifyCommand(options, console_, nullptr);
   }
 
   ExitCode diff(const std::filesystem::path& before, const std::filesystem::path& after) {

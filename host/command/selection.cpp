@@ -1,5 +1,6 @@
 #include "host/command/selection.h"
 
+#include "base/text/nearest_name.h"
 #include "host/plugin/plugin_loader.h"
 #include "host/plugin/plugin_trust.h"
 #include "host/plugin/profile.h"
@@ -120,7 +121,7 @@ std::vector<std::filesystem::path> recordedPlugins(const std::vector<std::string
 }
 
 IsolationOptions isolationOf(const Options& options, const Installation& installation) {
-  IsolationOptions isolation{options.plugins, options.memory, options.deadlines, options.grace};
+  IsolationOptions isolation{options.plugins, options.memory, options.deadlines, options.grace, options.heartbeat};
   if (!isolation.plugins.empty()) return isolation;
   isolation.plugins = installation.defaultPlugins();
   isolation.unasked = !isolation.plugins.empty();
@@ -184,6 +185,26 @@ Selection select(const Options& options, const Installation& installation, Watch
     selection.diagnostics.push_back({std::move(one), std::move(parameters)});
   }
   return selection;
+}
+
+std::vector<std::string> wantedScenarios(const std::vector<std::string>& names, const Installation& installation) {
+  std::vector<std::string> all = installation.scenarioNames();
+  if (names.empty()) return all;
+  std::vector<std::string> wanted;
+  for (const std::string& name : names) {
+    if (std::filesystem::is_regular_file(name)) {
+      wanted.push_back(name);
+      continue;
+    }
+    const std::size_t before = wanted.size();
+    for (const std::string& one : all) {
+      if (matchesName(name, one) && std::find(wanted.begin(), wanted.end(), one) == wanted.end()) wanted.push_back(one);
+    }
+    const bool found = wanted.size() > before || std::find(wanted.begin(), wanted.end(), name) != wanted.end();
+    if (!found)
+      throw CommandError(ExitCode::kUsage, "no installed phone is called '" + name + "'" + didYouMean(name, all));
+  }
+  return wanted;
 }
 
 }  // namespace quazor

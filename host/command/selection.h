@@ -47,4 +47,8 @@ PluginScan scanForSelection(const Options& options, const Installation& installa
 // plug-in could not be loaded, because that plug-in may define it.
 Selection select(const Options& options, const Installation& installation, WatchedSignals* signals = nullptr);
 
+// The installed scenarios and those of the user that the names and patterns fit, each once, and files; all without
+// names. Throws a CommandError (kUsage) for a name that fits none.
+std::vector<std::string> wantedScenarios(const std::vector<std::string>& names, const Installation& installation);
+
 }  // namespace quazor

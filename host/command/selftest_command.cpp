@@ -1,6 +1,5 @@
 #include "host/command/commands.h"
 
-#include "base/text/nearest_name.h"
 #include "contract/message_format.h"
 #include "host/command/selection.h"
 #include "host/command/selftest.h"
@@ -20,26 +19,6 @@
 namespace quazor {
 
 namespace {
-
-std::vector<std::string> wantedScenarios(const Options& options, const Installation& installation) {
-  std::vector<std::string> all = installation.scenarioNames();
-  if (options.names.empty()) return all;
-  std::vector<std::string> wanted;
-  for (const std::string& name : options.names) {
-    if (std::filesystem::is_regular_file(name)) {
-      wanted.push_back(name);
-      continue;
-    }
-    const std::size_t before = wanted.size();
-    for (const std::string& one : all) {
-      if (matchesName(name, one) && std::find(wanted.begin(), wanted.end(), one) == wanted.end()) wanted.push_back(one);
-    }
-    const bool found = wanted.size() > before || std::find(wanted.begin(), wanted.end(), name) != wanted.end();
-    if (!found)
-      throw CommandError(ExitCode::kUsage, "no installed phone is called '" + name + "'" + didYouMean(name, all));
-  }
-  return wanted;
-}
 
 constexpr const char* kStrict = "strict";  // an installed profile
 
@@ -78,7 +57,7 @@ class Selftest {
   // Ends at an interrupt; the phone that was running then is left out.
   SelftestOutcome perform() {
     SelftestOutcome outcome;
-    const std::vector<std::string> names = wantedScenarios(options_, installation_);
+    const std::vector<std::string> names = wantedScenarios(options_.names, installation_);
     outcome.seeds = options_.seeds;
     for (const std::string& name : names) {
       const ScenarioSummary summary = summaryOfScenario(installation_.scenario(name), installation_.scenarioSource());

@@ -1,9 +1,13 @@
 """`quazor verify` of several records and of folders."""
 
+import json
 import os
+import signal
+import time
 import unittest
 
-from command_line_fixture import RecordTest, quazor
+from command_line_fixture import RecordTest, quazor, start
+from terminal_fixture import Terminal
 
 
 class ManyRecordsTest(RecordTest):
@@ -93,6 +97,61 @@ class ManyRecordsTest(RecordTest):
         words = [line.split()[0] for line in lines[:-1]]
         self.assertEqual(words, ["UNREADABLE"] * (first + 1) + ["INCOMPLETE"] * (len(whole) - first - 1))
         self.assertEqual(lines[-1], f"{len(whole)} records: {len(whole) - first - 1} incomplete, {first + 1} unreadable")
+
+
+class SlowRecordTest(RecordTest):
+    """The record arrives through a pipe, so it takes as long as the test wants."""
+
+    def setUp(self):
+        super().setUp()
+        lines = self.recorded().read_text().splitlines(keepends=True)
+        end = json.loads(lines[-3])["sequence"]
+        log = {"event": "log", "date": "2026-11-21T01:08:00.000000000Z", "nanoseconds": 0, "level": "default", "text": ""}
+        events = [*map(json.loads, lines[:end]), *[dict(log) for _ in range(1000)], *map(json.loads, lines[end:])]
+        self.lines = [json.dumps({**event, "sequence": at}) + "\n" for at, event in enumerate(events)]
+        self.pipe = self.directory / "pipe.jsonl"
+        os.mkfifo(self.pipe)
+
+    def test_an_interrupt_keeps_what_was_verified(self):
+        for before, out, err in (
+                ([self.record], "1 record: 1 OK\n", "quazor: interrupted: 1 of 2 records were verified\n"),
+                ([], "", "quazor: interrupted before the record was verified\n")):
+            with self.subTest(before):
+                process = start("verify", *before, self.pipe)
+                writer = os.open(self.pipe, os.O_WRONLY)  # waits until the program has opened it, too
+                process.send_signal(signal.SIGINT)
+                try:
+                    os.write(writer, "".join(self.lines[:600]).encode())
+                except BrokenPipeError:  # it has ended before it read everything
+                    pass
+                output, errors = process.communicate(timeout=60)
+                os.close(writer)
+                self.assertEqual((process.returncode, errors), (130, err))
+                self.assertTrue(output.endswith(out), output)
+                self.assertEqual(output.count("OK  "), len(before))
+
+    def test_a_terminal_shows_the_progress(self):
+        for before, text in (([self.record], "Verifying 2 of 2: pipe.jsonl"), ([], "Verifying: pipe.jsonl")):
+            with self.subTest(before):
+                terminal = Terminal(80, "verify", *before, self.pipe)
+                with open(self.pipe, "w") as writer:
+                    time.sleep(0.5)  # what takes less shows no progress
+                    writer.write("".join(self.lines[:600]))
+                    writer.flush()
+                    output = terminal.read_for(60, until=text.encode())
+                    writer.write("".join(self.lines[600:]))
+                code, rest = terminal.finish()
+                self.assertIn(text, output.decode())
+                self.assertEqual(code, 0, output + rest)
+                self.assertIn("\r\x1b[K", rest.decode())
+
+    def test_a_pipe_shows_none(self):
+        process = start("verify", self.record, self.pipe)
+        with open(self.pipe, "w") as writer:
+            time.sleep(0.5)
+            writer.write("".join(self.lines))
+        output, errors = process.communicate(timeout=60)
+        self.assertEqual((process.returncode, errors), (0, ""), output)
 
 
 if __name__ == "__main__":

@@ -85,6 +85,8 @@ void RecordBuilder::fold(const FaultsCounted& event) { record_.faults = event.fa
 
 void RecordBuilder::fold(const DiagnosticSkipped& event) { record_.skip = event.skip; }
 
+void RecordBuilder::fold(const Heartbeat& /*event*/) {}
+
 void RecordBuilder::fold(const DiagnosticCompleted& /*event*/) { completed_ = true; }
 
 void RecordBuilder::fold(const DiagnosticEnded& event) {

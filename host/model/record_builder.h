@@ -43,6 +43,7 @@ class RecordBuilder final : public RunEventSink {
   void fold(const Failed& event);
   void fold(const FaultsCounted& event);
   void fold(const DiagnosticSkipped& event);
+  void fold(const Heartbeat& event);
   void fold(const DiagnosticCompleted& event);
   void fold(const DiagnosticEnded& event);
   void fold(const RunEnded& event);

@@ -95,6 +95,13 @@ struct DiagnosticSkipped {
   Skip skip;
 };
 
+// A sign that the diagnostic is still running, by the clock of this machine.
+struct Heartbeat {
+  Stage stage;                         // the current or the last one
+  std::chrono::nanoseconds elapsed{};  // since the process of the diagnostic began
+  Date date{};
+};
+
 // The plug-in has finished; only the host sends further events of this diagnostic.
 struct DiagnosticCompleted {};
 
@@ -110,7 +117,7 @@ struct RunEnded {
 };
 
 using RunEvent = std::variant<RunStarted, DiagnosticStarted, StageStarted, StageEnded, Logged, MeasurementsAdded,
-                              AuxiliaryDataAdded, ResultsReported, Failed, FaultsCounted, DiagnosticSkipped,
+                              AuxiliaryDataAdded, ResultsReported, Failed, FaultsCounted, DiagnosticSkipped, Heartbeat,
                               DiagnosticCompleted, DiagnosticEnded, RunEnded>;
 
 // Receives the events of a run, in order.

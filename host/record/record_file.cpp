@@ -28,6 +28,7 @@ namespace {
 
 using Json = nlohmann::ordered_json;
 
+constexpr std::size_t kEventsPerProgress = 256;
 constexpr mode_t kMode = 0666;  // reduced by the umask
 constexpr const char* kBusy = "another process is writing it";
 constexpr const char* kExists =
@@ -225,7 +226,7 @@ void RecordWriter::write(const std::string& line) {
   }
 }
 
-StoredRecord readRecord(const std::filesystem::path& file) {
+StoredRecord readRecord(const std::filesystem::path& file, const std::function<void(std::uint64_t bytes)>& onProgress) {
   std::ifstream stream(file, std::ios::binary);
   std::error_code ignored;
   if (!stream || std::filesystem::is_directory(file, ignored)) {
@@ -234,7 +235,10 @@ StoredRecord readRecord(const std::filesystem::path& file) {
   }
   StoredRecord stored;
   std::string line;
+  std::uint64_t bytes = 0;
   while (readLine(stream, line)) {
+    bytes += line.size() + 1;
+    if (onProgress && stored.events.size() % kEventsPerProgress == 0) onProgress(bytes);
     if (stream.eof()) {
       stored.cutOff = true;
       break;

@@ -7,6 +7,7 @@
 
 #include <cstdint>
 #include <filesystem>
+#include <functional>
 #include <optional>
 #include <string>
 #include <vector>
@@ -77,7 +78,9 @@ class RecordDefect : public CommandError {
 
 // Throws a CommandError (kCannotRead) that names the file if it cannot be read or has no complete line, and a
 // RecordDefect (kCannotRead) that names file and line if a line is wrong.
-StoredRecord readRecord(const std::filesystem::path& file);
+// `onProgress`, which may throw, is called now and then with the number of bytes that were read.
+StoredRecord readRecord(const std::filesystem::path& file,
+                        const std::function<void(std::uint64_t bytes)>& onProgress = nullptr);
 
 // The run stored in a record. Incomplete diagnostics have the verdict kError.
 struct RecordedRun {

@@ -376,6 +376,16 @@ RunEvent readSkipped(const Json& json) {
   return DiagnosticSkipped{{*kind, textAt(json, "reason")}};
 }
 
+Json jsonOf(const Heartbeat& event) {
+  Json json = jsonOf(StageEnded{event.stage, event.elapsed, event.date});
+  json["event"] = "heartbeat";
+  return json;
+}
+
+RunEvent readHeartbeat(const Json& json) {
+  return Heartbeat{stageAt(json, "stage"), nanosecondsAt(json, "nanoseconds"), dateAt(json, "date")};
+}
+
 Json jsonOf(const DiagnosticCompleted& /*event*/) { return {{"event", "diagnosticCompleted"}}; }
 
 RunEvent readDiagnosticCompleted(const Json& /*json*/) { return DiagnosticCompleted{}; }
@@ -419,6 +429,7 @@ constexpr Reader kReaders[] = {{"runBegan", readRunBegan},
                                {"failed", readFailed},
                                {"faultsCounted", readFaultsCounted},
                                {"skipped", readSkipped},
+                               {"heartbeat", readHeartbeat},
                                {"diagnosticCompleted", readDiagnosticCompleted},
                                {"diagnosticEnded", readDiagnosticEnded},
                                {"runEnded", readRunEnded}};

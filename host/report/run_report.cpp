@@ -1,17 +1,23 @@
 #include "host/report/run_report.h"
 
 #include "backends/log/standard_error_log.h"
+#include "contract/message_format.h"
 #include "host/report/text_report.h"
 #include "host/report/variation_report.h"
 #include "host/system/output_file.h"
+#include "host/text/display_width.h"
 #include "host/text/table.h"
 #include "host/text/terminal.h"
 
+#include <algorithm>
+#include <chrono>
 #include <utility>
 
 namespace quazor {
 
 namespace {
+
+constexpr std::size_t kMaxNameInHeartbeat = 200;  // so that the line fits where it takesText()
 
 // Tells people who wait for a repeated run how far it is.
 std::string suffixOf(const DiagnosticStarted& diagnostic, const RunStarted& run) {
@@ -31,7 +37,10 @@ void RunReport::onEvent(const RunEvent& event) {
   if (const auto* const began = std::get_if<RunStarted>(&event)) {
     run_ = *began;
   } else if (const auto* const diagnostic = std::get_if<DiagnosticStarted>(&event)) {
-    progress_.start(diagnostic->name + suffixOf(*diagnostic, run_), expectedProgressOf(diagnostic->parameters));
+    const auto place = std::find(run_.names.begin(), run_.names.end(), diagnostic->name);
+    number_ = static_cast<std::size_t>(place - run_.names.begin()) + 1;
+    running_ = diagnostic->name + suffixOf(*diagnostic, run_);
+    progress_.start(running_, expectedProgressOf(diagnostic->parameters));
   } else if (const auto* const logged = std::get_if<Logged>(&event)) {
     const LogLine& line = logged->line;
     if (line.level > options_.shownLog) return;
@@ -39,6 +48,8 @@ void RunReport::onEvent(const RunEvent& event) {
       console_.err << readableLogLine(line.date, line.level, sharedLog().category(), printableLines(line.text))
                    << std::flush;
     });
+  } else if (const auto* const heartbeat = std::get_if<Heartbeat>(&event)) {
+    tell(*heartbeat);
   } else if (const auto* const ended = std::get_if<RunEnded>(&event)) {
     finishRun(*ended);
   }
@@ -61,6 +72,16 @@ void RunReport::addRecord(DiagnosticRecord record) {
   }
   printUnfiredFaults(console_.err, record);
   records_.push_back(std::move(record));
+}
+
+// The run does not wait for the reader of its heartbeats.
+void RunReport::tell(const Heartbeat& event) {
+  if (console_.showsProgress || (console_.takesText && !console_.takesText())) return;
+  const auto seconds = std::chrono::duration_cast<std::chrono::seconds>(event.elapsed).count();
+  console_.err << formatMessage("quazor: running %@ (%@ of %@), stage %@, for %@ s\n",
+                                shortened(printable(running_), kMaxNameInHeartbeat), number_,
+                                std::max(run_.names.size(), number_), nameOf(event.stage), seconds)
+               << std::flush;
 }
 
 void RunReport::finishRun(const RunEnded& event) {

@@ -9,6 +9,8 @@
 #include "host/report/progress.h"
 #include "host/report/report_format.h"
 
+#include <cstddef>
+#include <functional>
 #include <optional>
 #include <ostream>
 #include <string>
@@ -23,6 +25,8 @@ struct Console {
   bool colour = false;         // `out` supports colour
   bool showsProgress = false;  // `err` is a terminal
   bool blocks = false;         // `out` supports UTF-8 and block elements
+  // False if a short text to `err` would have to wait for its reader; empty: never.
+  std::function<bool()> takesText{};
 };
 
 struct ReportOptions {
@@ -56,6 +60,7 @@ class RunReport final : public RunEventSink {
   Progress& progress() { return progress_; }
 
  private:
+  void tell(const Heartbeat& event);
   void finishRun(const RunEnded& event);
   void writeFile(const OutputRequest& output, const std::optional<std::string>& interrupted);
 
@@ -63,6 +68,8 @@ class RunReport final : public RunEventSink {
   Console& console_;
   Progress progress_;
   RunStarted run_;
+  std::string running_;     // the diagnostic that began last
+  std::size_t number_ = 0;  // its place among those to run
   std::vector<DiagnosticRecord> records_;
   bool allWritten_ = true;
 };

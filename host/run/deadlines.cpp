@@ -62,6 +62,15 @@ std::chrono::nanoseconds parseSettle(const std::string& text) {
   return settle;
 }
 
+std::chrono::nanoseconds parseHeartbeat(const std::string& text) {
+  const std::string what = "--heartbeat '" + text + "': ";
+  const std::chrono::nanoseconds period = parseSeconds(what, text);
+  if (period.count() != 0 && period < std::chrono::seconds(1)) {
+    throw CommandError(ExitCode::kUsage, what + "the time must be at least 1 second, or 0 for no heartbeat");
+  }
+  return period;
+}
+
 Deadlines::Deadlines(const ResolvedParameters& parameters, const std::vector<DeadlineSetting>& settings) {
   times_.fill(kDefault);
   if (const std::optional<double> seconds = expectedProgressOf(parameters).seconds) {

@@ -30,6 +30,9 @@ std::chrono::nanoseconds parseGrace(const std::string& text);
 // or more.
 std::chrono::nanoseconds parseSettle(const std::string& text);
 
+// The time of a --heartbeat option: SECONDS. Throws a CommandError (kUsage) if it is neither 0 nor at least 1.
+std::chrono::nanoseconds parseHeartbeat(const std::string& text);
+
 // Thread: any; it is immutable.
 class Deadlines {
  public:

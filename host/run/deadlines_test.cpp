@@ -56,6 +56,13 @@ TEST(ParseGrace, TakesSeconds) {
   EXPECT_EQ(parseGrace("0"), 0s);
   EXPECT_EQ(parseGrace("0.25"), 250ms);
   EXPECT_EQ(parseGrace("1e300"), kYear);
+  EXPECT_EQ(parseHeartbeat("0"), 0s);
+  EXPECT_EQ(parseHeartbeat("1"), 1s);
+  EXPECT_EQ(parseHeartbeat("2.5"), 2500ms);
+  for (const std::string text : {"0.5", "-1", "1e-3"}) {
+    EXPECT_EQ(refusalOf(ExitCode::kUsage, [&text] { parseHeartbeat(text); }),
+              "--heartbeat '" + text + "': the time must be at least 1 second, or 0 for no heartbeat");
+  }
   EXPECT_EQ(refusalOf(ExitCode::kUsage, [] { parseGrace("-1"); }), "--grace '-1': the time must not be less than zero");
   EXPECT_EQ(refusalOf(ExitCode::kUsage, [] { parseGrace("soon"); }), "--grace 'soon': 'soon' is not a number");
 }

@@ -1,5 +1,6 @@
 #include "host/run/diagnostic_run.h"
 
+#include "base/text/utf8.h"
 #include "host/error/host_error.h"
 #include "host/error/nesting.h"
 #include "host/model/run_log.h"
@@ -16,6 +17,7 @@
 #include <optional>
 #include <string>
 #include <utility>
+#include <variant>
 
 namespace quazor {
 
@@ -25,20 +27,45 @@ namespace {
 // reader from waiting.
 constexpr std::size_t kChunk = 500;
 
-// Serializes events from several threads.
+// Serializes events from several threads, and keeps the last log line of level error.
+// Thread: any.
 class OneAtATime final : public RunEventSink {
  public:
   explicit OneAtATime(RunEventSink& events) : events_(events) {}
 
   void onEvent(const RunEvent& event) override {
     const std::lock_guard lock(mutex_);
+    const auto* const logged = std::get_if<Logged>(&event);
+    if (logged != nullptr && logged->line.level == LogLevel::kError) lastErrorLine_ = logged->line.text;
     events_.onEvent(event);
+  }
+
+  // The last error line since the last call; empty if there was none.
+  std::string takeLastErrorLine() {
+    const std::lock_guard lock(mutex_);
+    return std::exchange(lastErrorLine_, {});
   }
 
  private:
   std::mutex mutex_;
   RunEventSink& events_;
+  std::string lastErrorLine_;
 };
+
+// Only the log can tell the cause of a failure without an error. A longer line is cut between two characters.
+DiagnosticErrorPtr withErrorLine(DiagnosticErrorPtr failure, std::string line) {
+  constexpr std::size_t kMaxQuoted = 500;
+  const bool isWithoutError = failure->domain() == QuazorHostErrorDomain &&
+                              failure->code() == static_cast<std::int64_t>(HostErrorCode::kNoErrorGiven);
+  if (!isWithoutError || line.empty()) return failure;
+  if (line.size() > kMaxQuoted) {
+    std::size_t end = kMaxQuoted;
+    while (end > 0 && continuesUtf8(line[end])) --end;
+    line.replace(end, std::string::npos, "...");
+  }
+  return hostError(HostErrorCode::kNoErrorGiven,
+                   failure->localizedDescription() + "; the last error line of its log: " + line);
+}
 
 // Sends the log lines of a run as events during its lifetime.
 class LogOfRun {
@@ -64,7 +91,7 @@ class LogOfRun {
 // The state of one run between its stages.
 class Run {
  public:
-  Run(const Diagnostic& diagnostic, const ResolvedParameters& parameters, const Clock& clock, RunEventSink& events,
+  Run(const Diagnostic& diagnostic, const ResolvedParameters& parameters, const Clock& clock, OneAtATime& events,
       std::function<bool()> isInterrupted = nullptr)
       : diagnostic_(diagnostic),
         parameters_(parameters),
@@ -162,7 +189,9 @@ class Run {
   template <class Call>
   bool attempt(const std::string& operation, Call&& call) {
     DiagnosticErrorPtr failure;
+    events_.takeLastErrorLine();  // of an earlier operation
     if (callPlugin(operation, &failure, std::forward<Call>(call))) return true;
+    failure = withErrorLine(std::move(failure), events_.takeLastErrorLine());
     events_.onEvent(Failed{stage_, errorWithinLevels(std::move(failure))});
     return false;
   }
@@ -211,7 +240,7 @@ class Run {
   const Diagnostic& diagnostic_;
   const ResolvedParameters& parameters_;
   const Clock& clock_;
-  RunEventSink& events_;
+  OneAtATime& events_;
   const std::function<bool()> isInterrupted_;
   Stage stage_ = Stage::kDescribe;
   QZDiagnosticHost host_;

@@ -221,7 +221,9 @@ TEST_F(ExperimentRunTest, EndsInTheErrorOfTheStageThatFails) {
       {"setup fails", Behaviour::kSetupFails, "FakeDomain 1 setup failed", 0},
       {"run fails", Behaviour::kRunFails, "FakeDomain 2 run failed", 0},
       {"run fails without an error", Behaviour::kRunFailsWithoutError,
-       "QuazorHostErrorDomain 1 run of FakeExperiment failed without giving an error", 0},
+       "QuazorHostErrorDomain 1 run of FakeExperiment failed without giving an error; the last error line of its log: "
+       "an error line",
+       0},
       {"run throws", Behaviour::kRunThrows,
        "QuazorHostErrorDomain 2 run of FakeExperiment threw an exception: run threw", 0},
       {"run throws an integer", Behaviour::kRunThrowsAnInteger,
@@ -276,7 +278,9 @@ constexpr FailureRow kFailures[] = {
      "QuazorHostErrorDomain 2 setup of FakeExperiment threw something that is not a standard exception", "s", 0},
     {"RunFails", Behaviour::kRunFails, "FakeDomain 2 run failed", "srt", 0},
     {"RunFailsWithoutError", Behaviour::kRunFailsWithoutError,
-     "QuazorHostErrorDomain 1 run of FakeExperiment failed without giving an error", "srt", 0},
+     "QuazorHostErrorDomain 1 run of FakeExperiment failed without giving an error; the last error line of its log: "
+     "an error line",
+     "srt", 0},
     {"RunThrows", Behaviour::kRunThrows, "QuazorHostErrorDomain 2 run of FakeExperiment threw an exception: run threw",
      "srt", 0},
     {"RunThrowsAnInteger", Behaviour::kRunThrowsAnInteger,

@@ -51,11 +51,12 @@ class EventsToConnection final : public RunEventSink {
 // The parent's side of one run in a separate process.
 class IsolatedRun {
  public:
-  IsolatedRun(const Diagnostic& diagnostic, const Deadlines& deadlines, std::chrono::nanoseconds grace,
+  IsolatedRun(const Diagnostic& diagnostic, const Deadlines& deadlines, const IsolationOptions& options,
               std::string token, SharedCounter& interrupted, Progress& progress, RunEventSink& events)
       : diagnostic_(diagnostic),
         deadlines_(deadlines),
-        grace_(grace),
+        grace_(options.grace),
+        heartbeat_(options.heartbeat),
         token_(std::move(token)),
         interrupted_(interrupted),
         progress_(progress),
@@ -71,7 +72,10 @@ class IsolatedRun {
     // A process that is about to end may do so before an interrupt ends it.
     supervision.isDone = [this, &signals] { return order_.isCompleted() && signals.requestsToEnd() > 0; };
     supervision.mayFinish = [this] { return interrupt(); };
-    supervision.tick = [this] { progress_.update(); };
+    supervision.tick = [this] {
+      progress_.update();
+      beat();
+    };
     return supervision;
   }
 
@@ -127,6 +131,13 @@ class IsolatedRun {
 
   void log(std::string text) { events_.onEvent(Logged{{time_, LogLevel::kDefault, std::move(text), dateNow()}, true}); }
 
+  void beat() {
+    const Moment now = SteadyClock::now();
+    if (heartbeat_.count() == 0 || now - lastBeat_ < heartbeat_) return;
+    lastBeat_ = now;
+    events_.onEvent(Heartbeat{order_.stage(), now - begin_, dateNow()});
+  }
+
   std::string during() const { return formatMessage("the stage %@ of %@", nameOf(order_.stage()), diagnostic_.name); }
 
   bool isInterrupted() const { return isInterrupted_; }
@@ -164,12 +175,15 @@ class IsolatedRun {
   const Diagnostic& diagnostic_;
   const Deadlines& deadlines_;
   const std::chrono::nanoseconds grace_;
+  const std::chrono::nanoseconds heartbeat_;
   const std::string token_;
   SharedCounter& interrupted_;  // 1 after an interrupt; for the process, which may write anything to it
   Progress& progress_;
   RunEventSink& events_;
   EventOrder order_;
   bool isInterrupted_ = false;
+  const Moment begin_ = SteadyClock::now();
+  Moment lastBeat_ = begin_;
   Moment deadline_;
   Moment graceEnd_;                  // of the setup or run that was interrupted
   std::chrono::nanoseconds time_{};  // time of the last log line
@@ -243,7 +257,7 @@ bool superviseRun(const IsolationOptions& options, WatchedSignals& signals, cons
                                     "the process of " + diagnostic.name + " could not be created: " + problem.what())});
     return true;
   }
-  IsolatedRun run(diagnostic, deadlines, options.grace, token, shared.interrupted, progress, events);
+  IsolatedRun run(diagnostic, deadlines, options, token, shared.interrupted, progress, events);
   Supervised end = supervise(*child, signals, run.supervision(signals));
   child.reset();  // ends what the process has left behind
   end = withInterrupt(end, run.isCompleted() && signals.requestsToEnd() > 0);

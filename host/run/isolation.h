@@ -24,6 +24,7 @@ struct IsolationOptions {
   std::optional<std::uint64_t> memory;  // limit of a process's address space in bytes; nothing: the system's limit
   std::vector<DeadlineSetting> deadlines;
   std::chrono::nanoseconds grace = kDefaultGrace;
+  std::chrono::nanoseconds heartbeat{};  // the time between two Heartbeat events of a run; zero: none
   bool unasked = false;  // nobody named the plug-ins: a refused one is an error of its own and stops no other
 };
 

@@ -241,7 +241,7 @@ bool goesDark(const WatchedSignals& signals, std::chrono::milliseconds duration)
         if (::write(descriptor, "dark", 4) < 0) ::_exit(1);
       };
       int number = 0;
-      const auto guard = startProjectorGuard(device, {{1, 0}}, darken, &number);
+      const auto guard = startProjectorGuard({device}, {{1, 0}}, darken, &number);
       ::raise(SIGKILL);
     };
     ChildProcess child(signals, body, std::nullopt, [](std::string_view name) { return name == kProjectorGuardName; });

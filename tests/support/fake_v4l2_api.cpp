@@ -6,6 +6,7 @@
 #include <cerrno>
 #include <cstring>
 #include <fstream>
+#include <iomanip>
 #include <utility>
 
 namespace quazor {
@@ -64,8 +65,18 @@ FakeV4l2Api::~FakeV4l2Api() { std::filesystem::remove_all(roots_.sysfs.parent_pa
 std::string FakeV4l2Api::add(int number, FakeNode node) {
   const std::string name = "video" + std::to_string(number);
   const std::filesystem::path folder = roots_.sysfs / "class" / "video4linux" / name;
+  std::filesystem::remove_all(folder);
   std::filesystem::create_directories(folder);
   std::ofstream(folder / "name") << node.card << " node\n";
+  if (!node.device.empty()) {
+    const std::filesystem::path device = roots_.sysfs / "devices" / node.device;
+    std::filesystem::create_directories(device);
+    if (node.usbInterface) {
+      std::ofstream(device / "bInterfaceNumber")
+          << std::hex << std::setfill('0') << std::setw(2) << *node.usbInterface << "\n";
+    }
+    std::filesystem::create_directory_symlink(device, folder / "device");
+  }
   node.path = (roots_.dev / name).string();
   const std::lock_guard lock(mutex_);
   return nodes_.insert_or_assign(node.path, node).first->first;
@@ -112,7 +123,7 @@ void FakeV4l2Api::produceLocked(FakeNode& node, std::uint32_t flags) {
   if (!node.metadataNode.empty()) {
     FakeNode& metadata = nodes_.at(node.metadataNode);
     metadata.metadata = node.metadata;
-    fill(metadata, timestamp, 0);
+    fill(metadata, timestamp + node.metadataStampedAhead, 0);
   }
   changed_.notify_all();
 }
@@ -199,6 +210,13 @@ int FakeV4l2Api::open(const std::string& path) {
   return lastDescriptor_;
 }
 
+int FakeV4l2Api::openForQueries(const std::string& path) {
+  const int descriptor = open(path);
+  const std::lock_guard lock(mutex_);
+  if (descriptor >= 0) ++nodes_.at(path).queried;
+  return descriptor;
+}
+
 void FakeV4l2Api::close(int descriptor) {
   const std::lock_guard lock(mutex_);
   if (events_.erase(descriptor) > 0) return;
@@ -248,6 +266,9 @@ int FakeV4l2Api::call(FakeNode& node, int descriptor, unsigned long request, voi
       capability.device_caps = node.capabilities;
       return 0;
     }
+    case VIDIOC_G_FMT:
+      if (!isMetadata(node)) return ENOTTY;
+      return format(node, false, *static_cast<v4l2_format*>(argument));
     case VIDIOC_TRY_FMT:
     case VIDIOC_S_FMT: return format(node, request == VIDIOC_S_FMT, *static_cast<v4l2_format*>(argument));
     case VIDIOC_G_PARM:
@@ -291,6 +312,10 @@ int FakeV4l2Api::call(FakeNode& node, int descriptor, unsigned long request, voi
 }
 
 int FakeV4l2Api::format(FakeNode& node, bool sets, v4l2_format& format) const {
+  if (isMetadata(node)) {
+    format.fmt.meta = node.metadataFormat;
+    return 0;
+  }
   v4l2_pix_format& wanted = format.fmt.pix;
   if (sets && node.buffers > 0) return EBUSY;
   if (sizeOf(node, wanted.pixelformat, wanted.width, wanted.height) == nullptr) {
@@ -407,65 +432,11 @@ void FakeV4l2Api::unmap(void* address, std::size_t /*length*/) {
   if (node.mapped == 0 && node.owner < 0) node.buffers = 0;
 }
 
-short FakeV4l2Api::eventsOf(int descriptor) {
-  if (const auto event = events_.find(descriptor); event != events_.end()) return event->second ? POLLIN : 0;
-  const FakeNode& node = nodes_.at(descriptors_.at(descriptor));
-  if (node.gone) return POLLPRI | POLLERR | POLLHUP;
-  if (node.broken || !node.streaming) return POLLERR;
-  if (!node.filled.empty()) return POLLIN;
-  return node.queued.empty() ? POLLERR : 0;
-}
-
-int FakeV4l2Api::poll(std::span<pollfd> descriptors, std::chrono::nanoseconds timeout) {
-  std::unique_lock lock(mutex_);
-  const std::chrono::nanoseconds end = now_ + timeout;
-  int ready = 0;
-  const auto look = [&] {
-    ready = 0;
-    for (pollfd& one : descriptors) {
-      one.revents = eventsOf(one.fd);
-      if (one.revents != 0) ++ready;
-      if ((one.revents & POLLERR) != 0) ++pollsWithoutEffect_;
-    }
-    return ready > 0 || (timeout.count() >= 0 && now_ >= end);
-  };
-  if (look()) return ready;
-  ++polling_;
-  changed_.notify_all();
-  changed_.wait(lock, look);
-  --polling_;
-  return ready;
-}
-
-int FakeV4l2Api::makeEvent() {
+std::unique_ptr<ControlGuard> FakeV4l2Api::guardControls(const std::string& path, int descriptor,
+                                                         const std::vector<ControlValue>& off, int* number) {
   const std::lock_guard lock(mutex_);
-  if (makeEventProblem != 0) return -makeEventProblem;
-  events_[++lastDescriptor_] = false;
-  return lastDescriptor_;
-}
-
-void FakeV4l2Api::signalEvent(int event) {
-  const std::lock_guard lock(mutex_);
-  events_.at(event) = true;
-  changed_.notify_all();
-}
-
-void FakeV4l2Api::clearEvent(int event) {
-  const std::lock_guard lock(mutex_);
-  events_.at(event) = false;
-  changed_.notify_all();
-}
-
-std::chrono::nanoseconds FakeV4l2Api::now() {
-  const std::lock_guard lock(mutex_);
-  return now_;
-}
-
-std::unique_ptr<ControlGuard> FakeV4l2Api::guardControls(const std::string& path, const std::vector<ControlValue>& off,
-                                                         int* number) {
-  const std::lock_guard lock(mutex_);
-  *number = guardProblem;
-  if (guardProblem != 0) return nullptr;
+  *number = descriptors_.at(descriptor) == path ? guardProblem : ENODEV;
+  if (*number != 0) return nullptr;
   ++guards_;
   nodes_.at(path).history.emplace_back("guard began");
   return std::make_unique<Guard>(*this, nodes_.at(path), off);

@@ -9,6 +9,7 @@
 
 #include <linux/videodev2.h>
 
+#include <atomic>
 #include <condition_variable>
 #include <cstdint>
 #include <deque>
@@ -53,17 +54,21 @@ struct FakeNode {
   std::string driver = "fake";
   std::string card = "fake camera";
   std::string bus;
+  std::string device;                         // its folder below /sys/devices; empty: none
+  std::optional<std::uint32_t> usbInterface;  // of that device
   std::uint32_t capabilities = V4L2_CAP_VIDEO_CAPTURE | V4L2_CAP_STREAMING;
   std::vector<FakeFormat> formats;
   std::vector<FakeControl> controls;
   std::uint32_t mostBuffers = 32;
   std::uint32_t timestampFlags = V4L2_BUF_FLAG_TIMESTAMP_MONOTONIC;
   std::uint32_t firstSequence = 0;
-  std::chrono::nanoseconds stampedAhead{0};  // the difference between a frame's time stamp and its delivery
-  std::string metadataNode;                  // its path: receives a buffer with each frame of this node
-  std::vector<std::uint8_t> metadata;        // the content of that buffer
+  std::chrono::nanoseconds stampedAhead{0};          // the difference between a frame's time stamp and its delivery
+  std::chrono::nanoseconds metadataStampedAhead{0};  // the same for its metadata, relative to the frame
+  std::string metadataNode;                          // its path: receives a buffer with each frame of this node
+  std::vector<std::uint8_t> metadata;                // the content of that buffer
   bool delivers = true;
   int openProblem = 0;  // an error number
+  v4l2_meta_format metadataFormat{v4l2_fourcc('F', 'A', 'K', 'E'), 64};
 
   v4l2_pix_format format{};
   FrameInterval interval{1, 5};
@@ -74,6 +79,7 @@ struct FakeNode {
   bool gone = false;
   bool broken = false;
   int opened = 0;
+  int queried = 0;  // how often it was opened for queries only
   int lockedBy = -1;
   std::deque<std::uint32_t> queued;
   std::deque<v4l2_buffer> filled;
@@ -103,9 +109,11 @@ class FakeV4l2Api : public V4l2Api {
   void failNext(const std::string& path, unsigned long request, int number, int times = 1, int after = 0);
   // Called before each call of a driver, on the same thread. Set it while there are no calls.
   std::function<void(unsigned long request)> beforeCall;
-  int failNextMaps = 0;      // with ENOMEM
-  int makeEventProblem = 0;  // an error number
-  int guardProblem = 0;      // an error number
+  int failNextMaps = 0;              // with ENOMEM
+  int makeEventProblem = 0;          // an error number
+  int guardProblem = 0;              // an error number
+  std::atomic<int> pollProblem = 0;  // an error number
+  std::atomic<int> failedPolls = 0;
 
   // Fills one buffer now. Without a queued buffer the frame is lost, and its number is skipped.
   void produce(const std::string& path, std::uint32_t flags = 0);
@@ -126,6 +134,7 @@ class FakeV4l2Api : public V4l2Api {
   std::uint64_t pollsWithoutEffect() const { return pollsWithoutEffect_; }
 
   int open(const std::string& path) override;
+  int openForQueries(const std::string& path) override;
   void close(int descriptor) override;
   int lock(int descriptor) override;
   int ioctl(int descriptor, unsigned long request, void* argument) override;
@@ -136,8 +145,8 @@ class FakeV4l2Api : public V4l2Api {
   void signalEvent(int event) override;
   void clearEvent(int event) override;
   std::chrono::nanoseconds now() override;
-  std::unique_ptr<ControlGuard> guardControls(const std::string& path, const std::vector<ControlValue>& off,
-                                              int* number) override;
+  std::unique_ptr<ControlGuard> guardControls(const std::string& path, int descriptor,
+                                              const std::vector<ControlValue>& off, int* number) override;
 
  private:
   class Guard;

@@ -27,6 +27,7 @@ constexpr std::size_t kMaxControlNameLength = 31;  // without the null; v4l2_que
 constexpr std::size_t kMaxDriverLength = 15;       // without the null, in v4l2_capability
 constexpr std::size_t kMaxCardLength = 31;
 constexpr std::size_t kMaxBusInfoLength = 31;
+constexpr std::uint64_t kMaxUsbInterface = 255;
 constexpr std::uint64_t kLastMetadataByte = 16777215;  // offset in a buffer
 
 // An optional comment key. If present, it must be a string.
@@ -66,12 +67,21 @@ std::optional<std::string> findControl(const JsonCursor& cursor, std::string_vie
 }
 
 VideoNodeMatch readMatch(const JsonCursor& cursor) {
-  cursor.allowKeys({"driver", "card", "busInfo"});
+  cursor.allowKeys({"driver", "card", "busInfo", "usbInterface", "path"});
   VideoNodeMatch match{findDeviceText(cursor, "driver", kMaxDriverLength),
                        findDeviceText(cursor, "card", kMaxCardLength),
                        findDeviceText(cursor, "busInfo", kMaxBusInfoLength)};
-  if (!match.driver && !match.card && !match.busInfo) {
-    cursor.fail("give at least one of \"driver\", \"card\" and \"busInfo\"; 'quazor phone probe' shows them.");
+  if (const auto interface = cursor.find("usbInterface")) {
+    match.usbInterface = static_cast<std::uint32_t>(interface->integer(0, kMaxUsbInterface));
+  }
+  if (const auto path = cursor.find("path")) {
+    match.path = readPathText(*path);
+    if (!match.path->starts_with("/sys/"))
+      path->fail("must be the device's path in sysfs, such as \"/sys/devices/...\".");
+  }
+  if (!match.driver && !match.card && !match.busInfo && !match.path) {
+    cursor.fail(
+        "give at least one of \"driver\", \"card\", \"busInfo\" and \"path\"; 'quazor phone probe' shows them.");
   }
   return match;
 }
@@ -83,6 +93,21 @@ std::vector<ControlSetting> readSettings(const JsonCursor& cursor) {
         {readControlName(name, value), value.isBoolean() ? std::int64_t{value.boolean()} : value.integer()});
   }
   return settings;
+}
+
+// Drivers pad shorter codes with spaces.
+std::string readFourcc(const JsonCursor& cursor) {
+  constexpr std::string_view kBigEndian = "-BE";
+  constexpr std::size_t kLength = 4;
+  std::string code = cursor.text();
+  const bool isBigEndian = code.size() > kLength && code.ends_with(kBigEndian);
+  if (isBigEndian) code.resize(code.size() - kBigEndian.size());
+  const bool isPrintable = std::ranges::all_of(code, [](char one) { return one >= ' ' && one <= '~'; });
+  if (code.size() > kLength || !isPrintable) {
+    cursor.fail("must be the code of a format, such as \"YUYV\"; 'quazor phone probe' shows the camera's codes.");
+  }
+  code.resize(kLength, ' ');
+  return isBigEndian ? code + std::string(kBigEndian) : code;
 }
 
 MetadataField readField(const std::string& key, const JsonCursor& cursor) {
@@ -105,12 +130,23 @@ MetadataField readField(const std::string& key, const JsonCursor& cursor) {
 }
 
 MetadataBinding readMetadata(const JsonCursor& cursor) {
-  cursor.allowKeys({"constants", "node", "fields", "controls"});
+  cursor.allowKeys({"constants", "node", "format", "pairing", "fields", "controls"});
   MetadataBinding metadata;
   if (const auto constants = cursor.find("constants")) {
     for (const auto& [key, value] : namedEntries(*constants)) metadata.constants.set(key, value.scalar());
   }
   if (const auto node = cursor.find("node")) metadata.node = readMatch(*node);
+  if (const auto format = cursor.find("format")) {
+    if (!metadata.node) format->fail("\"format\" requires a metadata \"node\".");
+    metadata.format = readFourcc(*format);
+  }
+  if (const auto pairing = cursor.find("pairing")) {
+    if (!metadata.node) pairing->fail("\"pairing\" requires a metadata \"node\".");
+    constexpr std::array<std::string_view, 2> kPairings{"timestamp", "sequence"};
+    metadata.pairing = pairing->oneOf(kPairings, "a way to pair frames and metadata") == kPairings[0]
+                           ? MetadataPairing::kTimestamp
+                           : MetadataPairing::kSequence;
+  }
   if (const auto fields = cursor.find("fields")) {
     if (!metadata.node) fields->fail("\"fields\" requires a metadata \"node\".");
     for (const auto& [key, value] : namedEntries(*fields)) metadata.fields.push_back(readField(key, value));
@@ -166,21 +202,6 @@ std::uint32_t readFormatIndex(const std::string& key, const JsonCursor& cursor) 
   const auto [parsed, problem] = std::from_chars(key.data(), end, index);
   if (problem == std::errc() && parsed == end && std::to_string(index) == key) return index;
   cursor.fail(inQuotes(key) + " is not a format index; expected a whole number, such as \"16\".");
-}
-
-// Drivers pad shorter codes with spaces.
-std::string readFourcc(const JsonCursor& cursor) {
-  constexpr std::string_view kBigEndian = "-BE";
-  constexpr std::size_t kLength = 4;
-  std::string code = cursor.text();
-  const bool isBigEndian = code.size() > kLength && code.ends_with(kBigEndian);
-  if (isBigEndian) code.resize(code.size() - kBigEndian.size());
-  const bool isPrintable = std::ranges::all_of(code, [](char one) { return one >= ' ' && one <= '~'; });
-  if (code.size() > kLength || !isPrintable) {
-    cursor.fail("must be the code of a format, such as \"YUYV\"; 'quazor phone probe' shows the camera's codes.");
-  }
-  code.resize(kLength, ' ');
-  return isBigEndian ? code + std::string(kBigEndian) : code;
 }
 
 FrameInterval readInterval(const JsonCursor& cursor) {
@@ -239,8 +260,9 @@ std::vector<CameraBinding> readCameras(const JsonCursor& cursor) {
     CameraBinding camera = readCamera(port, value);
     const auto isSame = [&camera](const CameraBinding& other) { return other.node == camera.node; };
     if (const auto same = std::ranges::find_if(cameras, isSame); same != cameras.end()) {
-      value.at("node").fail("this is the node of " + inQuotes(same->port) +
-                            "; every camera needs its own node. Distinguish them, for example by busInfo.");
+      value.at("node").fail(
+          "this is the node of " + inQuotes(same->port) +
+          "; every camera needs its own node. Distinguish them, for example by busInfo or usbInterface.");
     }
     cameras.push_back(std::move(camera));
   }

@@ -22,12 +22,14 @@ struct FrameInterval {
   friend bool operator==(const FrameInterval&, const FrameInterval&) = default;
 };
 
-// Selects a video node by what its driver reports (VIDIOC_QUERYCAP), because its number may change from boot to boot. A
-// member without a value matches everything.
+// Selects a video node by what its driver reports (VIDIOC_QUERYCAP) and by its place in sysfs, because its number may
+// change from boot to boot. A member without a value matches everything.
 struct VideoNodeMatch {
   std::optional<std::string> driver;
   std::optional<std::string> card;
   std::optional<std::string> busInfo;
+  std::optional<std::uint32_t> usbInterface;  // the number of the USB interface, for several cameras of one USB device
+  std::optional<std::string> path;            // of the device in sysfs, which changes if it is connected elsewhere
 
   friend bool operator==(const VideoNodeMatch&, const VideoNodeMatch&) = default;
 };
@@ -53,11 +55,16 @@ struct MetadataControl {
   std::string control;
 };
 
+// What a frame and its metadata buffer have in common.
+enum class MetadataPairing { kTimestamp, kSequence };
+
 // The sources of a frame's metadata dictionary. If two give the same key, the later one in this order applies.
 struct MetadataBinding {
   Dictionary constants;
-  std::optional<VideoNodeMatch> node;  // a metadata node; its buffers are matched to frames by time stamp
-  std::vector<MetadataField> fields;   // fields of those buffers; empty without a node
+  std::optional<VideoNodeMatch> node;      // a metadata node; its buffers are matched to frames by time stamp
+  std::optional<std::string> format;       // of that node, as FormatBinding::fourcc; nothing: any
+  std::optional<MetadataPairing> pairing;  // nothing: as the driver does it
+  std::vector<MetadataField> fields;       // fields of those buffers; empty without a node
   std::vector<MetadataControl> controls;
 };
 

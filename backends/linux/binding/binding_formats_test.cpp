@@ -45,5 +45,45 @@ TEST_F(BindingTest, RefusesFormatsThatCannotBe) {
   for (const Refused& row : kRows) EXPECT_THAT(problemOf(row.text), ::testing::StartsWith(row.problem)) << row.what;
 }
 
+TEST_F(BindingTest, MetadataMayHaveAFormat) {
+  const auto withMetadata = [](const std::string& entries) { return withCamera("\"metadata\": {" + entries + "}"); };
+  const std::string node = R"("node": {"card": "m"}, "fields": {"K": {"offset": 0}}, )";
+  EXPECT_EQ(read(withMetadata(node + R"("format": "UVC")")).cameras.at(0).metadata.format, "UVC ");
+  EXPECT_EQ(
+      problemOf(withMetadata(node + "\"format\": \"UVC header\"")),
+      "F:3: cameras.BackFacingCamera.metadata.format: must be the code of a format, such as \"YUYV\"; 'quazor phone "
+      "probe' shows the camera's codes.");
+  EXPECT_EQ(read(withMetadata(node + R"("pairing": "sequence")")).cameras.at(0).metadata.pairing,
+            MetadataPairing::kSequence);
+  EXPECT_EQ(read(withMetadata(node + R"("pairing": "timestamp")")).cameras.at(0).metadata.pairing,
+            MetadataPairing::kTimestamp);
+  EXPECT_EQ(
+      problemOf(withMetadata(node + R"("pairing": "order")")),
+      "F:3: cameras.BackFacingCamera.metadata.pairing: \"order\" is not a way to pair frames and metadata; expected "
+      "one of \"timestamp\", \"sequence\".");
+  EXPECT_EQ(problemOf(withMetadata("\"pairing\": \"sequence\"")),
+            "F:3: cameras.BackFacingCamera.metadata.pairing: \"pairing\" requires a metadata \"node\".");
+  EXPECT_EQ(problemOf(withMetadata("\"format\": \"UVCH\"")),
+            "F:3: cameras.BackFacingCamera.metadata.format: \"format\" requires a metadata \"node\".");
+}
+
+TEST_F(BindingTest, ANodeMayBeSelectedByItsPlace) {
+  const auto withNode = [](const std::string& node) {
+    return with(R"("cameras": {"BackFacingCamera": {"node": {)" + node + R"(}, "size": {"width": 4, "height": 2}}})");
+  };
+  const std::string node = "F:2: cameras.BackFacingCamera.node";
+  const VideoNodeMatch match =
+      read(withNode(R"("driver": "d", "usbInterface": 2, "path": "/sys/devices/a")")).cameras.at(0).node;
+  EXPECT_EQ(match, (VideoNodeMatch{"d", {}, {}, 2, "/sys/devices/a"}));
+  EXPECT_EQ(read(withNode("\"path\": \"/sys/devices/a\"")).cameras.at(0).node.path, "/sys/devices/a");
+  EXPECT_EQ(
+      problemOf(withNode("\"usbInterface\": 2")),
+      node + ": give at least one of \"driver\", \"card\", \"busInfo\" and \"path\"; 'quazor phone probe' shows them.");
+  EXPECT_EQ(problemOf(withNode(R"("driver": "d", "usbInterface": 256)")),
+            node + ".usbInterface: must be an integer from 0 to 255, not 256.");
+  EXPECT_EQ(problemOf(withNode("\"path\": \"/dev/video0\"")),
+            node + ".path: must be the device's path in sysfs, such as \"/sys/devices/...\".");
+}
+
 }  // namespace
 }  // namespace quazor

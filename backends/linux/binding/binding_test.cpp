@@ -71,7 +71,7 @@ TEST_F(BindingTest, ReadsAllThereIsToSay) {
   ASSERT_EQ(binding.cameras.size(), 2U);
   const CameraBinding& camera = binding.cameras[0];
   EXPECT_EQ(camera.port, "FrontFacingInfraredCamera");
-  EXPECT_EQ(camera.node, (VideoNodeMatch{"dr", "ca", "bu"}));
+  EXPECT_EQ(camera.node, (VideoNodeMatch{"dr", "ca", "bu", {}, {}}));
   EXPECT_EQ(camera.width, 640U);
   EXPECT_EQ(camera.height, 360U);
   EXPECT_THAT(camera.formats, ElementsAre(FormatBinding{16, "MJPG", 1280, 720, FrameInterval{1001, 30000}},
@@ -86,7 +86,7 @@ TEST_F(BindingTest, ReadsAllThereIsToSay) {
 
   const Dictionary constants{{"I", std::int64_t{1}}, {"D", 0.5}, {"S", "s"}, {"B", true}};
   EXPECT_EQ(camera.metadata.constants, constants);
-  EXPECT_EQ(camera.metadata.node, (VideoNodeMatch{std::nullopt, "meta", std::nullopt}));
+  EXPECT_EQ(camera.metadata.node, (VideoNodeMatch{{}, "meta", {}, {}, {}}));
   ASSERT_EQ(camera.metadata.fields.size(), 3U);
   EXPECT_EQ(camera.metadata.fields[0].key, "F");
   EXPECT_EQ(camera.metadata.fields[0].offset, 3U);
@@ -157,8 +157,8 @@ TEST_F(BindingTest, RefusesWhatCamerasCannotBe) {
       {"no node", with(R"("cameras": {"BackFacingCamera": {"size": {"width": 1, "height": 1}}})"),
        "F:2: cameras.BackFacingCamera: the key \"node\" is missing."},
       {"a node that is anything", with(R"("cameras": {"BackFacingCamera": {"node": {}}})"),
-       "F:2: cameras.BackFacingCamera.node: give at least one of \"driver\", \"card\" and \"busInfo\"; 'quazor phone "
-       "probe' shows them."},
+       "F:2: cameras.BackFacingCamera.node: give at least one of \"driver\", \"card\", \"busInfo\" and \"path\"; "
+       "'quazor phone probe' shows them."},
       {"no size", with(R"("cameras": {"BackFacingCamera": {"node": {"card": "c"}}})"),
        "F:2: cameras.BackFacingCamera: the key \"size\" is missing."},
       {"the same port twice", withCamera("\"buffers\": 2}, \"BackFacingCamera\": {"),
@@ -166,7 +166,7 @@ TEST_F(BindingTest, RefusesWhatCamerasCannotBe) {
       {"the same node twice",
        withCamera(R"("buffers": 2}, "FrontFacingCamera": {"node": {"card": "c"}, "size": {"width": 4, "height": 2})"),
        "F:3: cameras.FrontFacingCamera.node: this is the node of \"BackFacingCamera\"; every camera needs its own "
-       "node. Distinguish them, for example by busInfo."},
+       "node. Distinguish them, for example by busInfo or usbInterface."},
       {"one buffer", withCamera("\"buffers\": 1"), camera + ".buffers: must be an integer from 2 to 32, not 1."},
       {"33 buffers", withCamera("\"buffers\": 33"), camera + ".buffers: must be an integer from 2 to 32, not 33."},
       {"a width of 0",

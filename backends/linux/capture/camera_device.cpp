@@ -19,7 +19,7 @@ std::shared_ptr<V4l2Device> openMatching(const std::shared_ptr<V4l2Api>& kernel,
                                          const VideoNodeMatch& match, const std::string& port,
                                          DiagnosticErrorPtr* error) {
   const std::optional<V4l2DeviceInfo> node = findVideoNode(nodes, kind, match, port, error);
-  return node ? V4l2Device::open(kernel, node->path.string(), error) : nullptr;
+  return node ? V4l2Device::open(kernel, *node, error) : nullptr;
 }
 
 CameraInfo infoOf(const CameraBinding& binding) {
@@ -44,7 +44,7 @@ bool LinuxCamera::open(CameraSettings& settings, DiagnosticErrorPtr* error) {
   node_ = openMatching(kernel, nodes, VideoNodeKind::kCamera, binding_.node, port(), error);
   if (node_ != nullptr && binding_.metadata.node) {
     metadataNode_ = openMatching(kernel, nodes, VideoNodeKind::kMetadata, *binding_.metadata.node, port(), error);
-    if (metadataNode_ == nullptr) node_.reset();
+    if (metadataNode_ == nullptr || !checkMetadata(*metadataNode_, error)) node_.reset();
   }
   if (node_ != nullptr && !node_->undescribedControls().empty()) {
     logDefault("%@: the driver of %@ does not describe the controls %@; they cannot be used.", port(), node_->path(),
@@ -54,6 +54,25 @@ bool LinuxCamera::open(CameraSettings& settings, DiagnosticErrorPtr* error) {
   if (opened) settings.autoExposure = exposesAutomatically();
   if (!opened) close();
   return opened;
+}
+
+// The fields must fit the format of the metadata node. A driver that does not report its format is believed.
+bool LinuxCamera::checkMetadata(const V4l2Device& node, DiagnosticErrorPtr* error) const {
+  const MetadataBinding& metadata = binding_.metadata;
+  const std::optional<MetadataFormat> format = node.metadataFormat();
+  if (metadata.format && (!format || format->fourcc != *metadata.format)) {
+    return refuseLinux(error, LinuxErrorCode::kNotSupported,
+                       "%@: the binding's fields are those of the metadata format %@, but %@ has the format %@.",
+                       port(), *metadata.format, node.path(), format ? format->fourcc : "that it does not report");
+  }
+  for (const MetadataField& field : metadata.fields) {
+    const std::uint64_t end = std::uint64_t{field.offset} + field.bytes;
+    if (!format || format->bytes == 0 || end <= format->bytes) continue;
+    return refuseLinux(error, LinuxErrorCode::kNotSupported,
+                       "%@: the metadata field \"%@\" ends at byte %@, but the buffers of %@ (format %@) have %@.",
+                       port(), field.key, end, node.path(), format->fourcc, format->bytes);
+  }
+  return true;
 }
 
 bool LinuxCamera::prepare(DiagnosticErrorPtr* error) {

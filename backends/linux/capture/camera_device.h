@@ -56,6 +56,7 @@ class LinuxCamera final : public CameraBack {
  private:
   const std::string& port() const { return binding_.port; }
   bool prepare(DiagnosticErrorPtr* error);
+  bool checkMetadata(const V4l2Device& node, DiagnosticErrorPtr* error) const;
   bool exposesAutomatically() const;
   VideoMode modeOf(const CameraSettings& settings) const;
   const FormatBinding* formatOf(const CameraSettings& settings) const;

@@ -26,7 +26,8 @@ struct CameraPoller::State {
   using Streams = std::vector<std::shared_ptr<PolledStream>>;
 
   void run();
-  void waitForEvents(std::unique_lock<std::mutex>& lock, std::vector<pollfd>& polled, const Streams& watched);
+  int waitForEvents(std::unique_lock<std::mutex>& lock, std::vector<pollfd>& polled, const Streams& watched);
+  void endAll(std::unique_lock<std::mutex>& lock, const Streams& watched, int number);
   void serve(std::unique_lock<std::mutex>& lock, const std::shared_ptr<PolledStream>& stream,
              std::span<const pollfd> polled);
   bool isAdded(const PolledStream* stream) const {
@@ -56,7 +57,11 @@ void CameraPoller::State::run() {
       stream->watch(polled);
     }
     begins.push_back(polled.size());
-    waitForEvents(lock, polled, watched);
+    if (const int failure = waitForEvents(lock, polled, watched); failure != 0) {
+      endAll(lock, watched, failure);
+      watched.clear();
+      continue;
+    }
     for (std::size_t i = 0; i < watched.size(); ++i) {
       if (isAdded(watched[i].get())) {
         serve(lock, watched[i], std::span(polled).subspan(begins[i], begins[i + 1] - begins[i]));
@@ -68,8 +73,8 @@ void CameraPoller::State::run() {
   }
 }
 
-void CameraPoller::State::waitForEvents(std::unique_lock<std::mutex>& lock, std::vector<pollfd>& polled,
-                                        const Streams& watched) {
+int CameraPoller::State::waitForEvents(std::unique_lock<std::mutex>& lock, std::vector<pollfd>& polled,
+                                       const Streams& watched) {
   std::optional<std::chrono::nanoseconds> until;
   for (const auto& stream : watched) {
     const auto deadline = stream->deadline();
@@ -79,12 +84,28 @@ void CameraPoller::State::waitForEvents(std::unique_lock<std::mutex>& lock, std:
   lock.unlock();
   std::chrono::nanoseconds timeout(-1);
   if (until) timeout = std::max(std::chrono::nanoseconds(0), *until - kernel->now());
-  kernel->poll(polled, timeout);
+  const int result = kernel->poll(polled, timeout);
   if (polled.front().revents != 0) kernel->clearEvent(event);
   lock.lock();
   waiting = false;
   ++waits;
   changed.notify_all();
+  return result < 0 ? -result : 0;
+}
+
+// Ends the streams that were watched: the next wait would fail at once, over and over.
+void CameraPoller::State::endAll(std::unique_lock<std::mutex>& lock, const Streams& watched, int number) {
+  for (const auto& stream : watched) {
+    if (!isAdded(stream.get())) continue;
+    std::erase(streams, stream);
+    served = stream.get();
+    lock.unlock();
+    stream->onPollFailed(number);
+    lock.lock();
+    served = nullptr;
+    changed.notify_all();
+  }
+  changed.wait(lock, [this] { return ended || !streams.empty(); });
 }
 
 void CameraPoller::State::serve(std::unique_lock<std::mutex>& lock, const std::shared_ptr<PolledStream>& stream,
@@ -106,6 +127,7 @@ CameraPoller::~CameraPoller() {
     const std::lock_guard lock(state_->mutex);
     state_->ended = true;
     left.swap(state_->streams);
+    state_->changed.notify_all();
   }
   if (!thread_.joinable()) return;
   state_->kernel->signalEvent(state_->event);
@@ -120,6 +142,7 @@ bool CameraPoller::add(std::shared_ptr<PolledStream> stream, DiagnosticErrorPtr*
   const std::lock_guard lock(state_->mutex);
   if (!thread_.joinable() && !begin(error)) return false;
   state_->streams.push_back(std::move(stream));
+  state_->changed.notify_all();
   state_->kernel->signalEvent(state_->event);
   return true;
 }

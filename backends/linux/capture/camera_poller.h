@@ -29,6 +29,8 @@ class PolledStream {
   // Handles events; `polled` contains the descriptors of watch() with their results. May remove this and other streams.
   // Returns false if there is nothing left to wait for: the stream is then removed.
   virtual bool serve(std::span<const pollfd> polled) = 0;
+  // The wait itself failed with this error number. The stream is removed.
+  virtual void onPollFailed(int number) = 0;
 };
 
 // The thread starts with the first stream and ends with the poller.

@@ -18,6 +18,13 @@ MediaTime mediaTimeOf(std::chrono::nanoseconds timestamp) {
   return time;
 }
 
+// The driver of USB cameras numbers the buffers of both nodes alike, and stamps them alike only without hwtimestamps.
+MetadataPairing pairingOf(const MetadataBinding& binding, const V4l2Device& camera) {
+  constexpr std::string_view kUsbDriver = "uvcvideo";
+  const bool isUsb = fixedText(camera.capability().driver) == kUsbDriver;
+  return binding.pairing.value_or(isUsb ? MetadataPairing::kSequence : MetadataPairing::kTimestamp);
+}
+
 }  // namespace
 
 CameraRun::CameraRun(CameraRunPlan plan, std::shared_ptr<DeliveredFrames> delivered)
@@ -25,6 +32,7 @@ CameraRun::CameraRun(CameraRunPlan plan, std::shared_ptr<DeliveredFrames> delive
       interval_(plan.interval),
       light_(std::move(plan.light)),
       delivered_(std::move(delivered)),
+      pairing_(pairingOf(camera_.metadata, *plan.node)),
       handler_(std::move(plan.handler)),
       node_(std::move(plan.node)),
       metadataNode_(handler_ == nullptr ? nullptr : std::move(plan.metadataNode)) {
@@ -48,7 +56,7 @@ bool CameraRun::enableProjector(DiagnosticErrorPtr* error) {
     off.push_back(valueFor(*control, setting.value));
   }
   int number = 0;
-  guard_ = node_->kernel().guardControls(node_->path(), off, &number);
+  guard_ = node_->kernel().guardControls(node_->path(), node_->descriptor(), off, &number);
   if (guard_ == nullptr) {
     failSystemCall(error, "guarding the projector", node_->path(), number);
     return false;
@@ -155,7 +163,7 @@ bool CameraRun::serveMetadata(const pollfd& polled) {
       return false;
     }
     const std::span<const std::uint8_t> contents = metadata_->contents(buffer);
-    if (!buffer.isBad) pairing_.addMetadata(buffer.timestamp, {contents.begin(), contents.end()});
+    if (!buffer.isBad) pairing_.addMetadata({buffer.timestamp, buffer.sequence}, {contents.begin(), contents.end()});
     const int queued = metadata_->queue(buffer.index);
     if (queued != 0) logFailure("VIDIOC_QBUF", *metadata_, queued);
   }
@@ -187,11 +195,15 @@ void CameraRun::takeFrame(const DequeuedBuffer& buffer) {
   if (buffer.isBad || handler_ == nullptr) return;
   CapturedFrame frame;
   frame.timestamp = buffer.timestamp;
+  frame.sequence = buffer.sequence;
   frame.controls = contents_->readControls(*node_);
   pairing_.addFrame(std::move(frame), node_->kernel().now());
 }
 
 void CameraRun::hand(const CapturedFrame& frame) {
+  if (metadata_ != nullptr && !frame.paired && !std::exchange(toldUnpaired_, true)) {
+    logError("%@: frame %@ has no metadata: %@.", camera_.port, frame.sequence, pairing_.whyUnpaired(frame));
+  }
   bool complete = false;
   PixelBuffer& buffer = FramePool::shared().take(contents_->dictionaryOf(frame, &complete));
   if (!complete) {

@@ -52,6 +52,7 @@ class CameraRun final : public PolledStream, public CaptureRun {
   void watch(std::vector<pollfd>& descriptors) const override;
   std::optional<std::chrono::nanoseconds> deadline() const override;
   bool serve(std::span<const pollfd> polled) override;
+  void onPollFailed(int number) override { countFailure("poll", number); }
 
  private:
   bool enableProjector(DiagnosticErrorPtr* error);
@@ -73,6 +74,7 @@ class CameraRun final : public PolledStream, public CaptureRun {
   std::unique_ptr<CameraMetadata> contents_;
   std::unique_ptr<ControlGuard> guard_;
   FramePairing pairing_;
+  bool toldUnpaired_ = false;  // only the first frame without metadata is logged
 
   // Null after end(). Only the poller's thread may read it without the mutex.
   std::shared_ptr<PixelBufferHandler> handler_;

@@ -69,7 +69,7 @@ class LinuxCaptureBack final : public CaptureBack {
   std::string missingDevice() const override {
     return cameras_.empty() ? "The binding names no camera, so there is no capture device." : "";
   }
-  void prepareToOpen() override { shared_->nodes = videoNodes(shared_->kernel, shared_->roots); }
+  void prepareToOpen() override { shared_->nodes = videoNodes(shared_->kernel, shared_->roots, shared_->nodes); }
   void storeRefusal(DiagnosticErrorPtr* error, CaptureRefusal reason, std::string message) const override {
     failLinux(error, codeOf(reason), std::move(message));
   }

@@ -17,7 +17,9 @@ struct DisplayConnector {
   std::string dpms;     // On, Standby, Suspend or Off
 
   bool isConnected() const { return status == "connected"; }
-  bool isPowered() const { return isConnected() && enabled == "enabled" && dpms == "On"; }
+  bool isPowered() const { return isConnected() && isLit(); }
+  // True if the display is on, provided that one is connected.
+  bool isLit() const { return enabled == "enabled" && dpms == "On"; }
 };
 
 // All connectors, sorted by card and name.

@@ -25,8 +25,8 @@ std::optional<DisplayConnector> connectorNamed(const std::string& name, const st
 
 class Registry final : public RegistryService {
  public:
-  Registry(std::string connector, std::filesystem::path sysfs)
-      : connector_(std::move(connector)), sysfs_(std::move(sysfs)) {}
+  Registry(std::string connector, bool isNamed, std::filesystem::path sysfs)
+      : connector_(std::move(connector)), isNamed_(isNamed), sysfs_(std::move(sysfs)) {}
 
   std::string description() const override { return "DRM connector " + connector_; }
 
@@ -34,11 +34,14 @@ class Registry final : public RegistryService {
     if (name != kDebugInfo) return std::nullopt;
     const std::optional<DisplayConnector> connector = connectorNamed(connector_, sysfs_);
     if (!connector) return std::nullopt;
-    return Value(Dictionary{{kPowerInfo, Dictionary{{kPanel, connector->isPowered()}}}});
+    // A driver that cannot detect a display reports "unknown". The binding then knows better.
+    const bool isConnected = connector->isConnected() || (isNamed_ && connector->status == "unknown");
+    return Value(Dictionary{{kPowerInfo, Dictionary{{kPanel, isConnected && connector->isLit()}}}});
   }
 
  private:
   const std::string connector_;
+  const bool isNamed_;  // in the binding
   const std::filesystem::path sysfs_;
 };
 
@@ -61,7 +64,7 @@ class LinuxFramebuffer final : public FramebufferService {
   std::shared_ptr<Display> mainDisplay() override {
     const std::optional<std::string> connector = mainConnector();
     if (!connector) return nullptr;
-    return std::make_shared<ConnectedDisplay>(std::make_shared<Registry>(*connector, sysfs_));
+    return std::make_shared<ConnectedDisplay>(std::make_shared<Registry>(*connector, display_.has_value(), sysfs_));
   }
 
  private:

@@ -52,7 +52,7 @@ TEST_F(LinuxFramebufferTest, IsPoweredOnlyWhenConnectedAndEnabledAndOn) {
     bool isPowered;
   } kRows[] = {
       {"connected", "enabled", "On", true},       {"disconnected", "enabled", "On", false},
-      {"unknown", "enabled", "On", false},        {"connected", "disabled", "On", false},
+      {"unknown", "disabled", "On", false},       {"connected", "disabled", "On", false},
       {"connected", "enabled", "Off", false},     {"connected", "enabled", "Standby", false},
       {"connected", "enabled", "Suspend", false}, {"disconnected", "disabled", "On", false},
   };
@@ -62,6 +62,14 @@ TEST_F(LinuxFramebufferTest, IsPoweredOnlyWhenConnectedAndEnabledAndOn) {
     ASSERT_NE(display, nullptr);
     EXPECT_EQ(stateOf(display), powered(row.isPowered)) << row.status << row.enabled << row.dpms;
   }
+}
+
+TEST_F(LinuxFramebufferTest, AConnectorOfUnknownStatusCountsAsConnectedIfTheBindingNamesIt) {
+  connector("card0-LVDS-1", "unknown");
+  EXPECT_EQ(displayOf(""), nullptr);
+  EXPECT_EQ(stateOf(displayOf("LVDS-1")), powered(true));
+  connector("card0-LVDS-1", "unknown", "enabled", "Off");
+  EXPECT_EQ(stateOf(displayOf("LVDS-1")), powered(false));
 }
 
 TEST_F(LinuxFramebufferTest, ReadsTheStateAnewEachTime) {

@@ -170,10 +170,6 @@ Json formatEntry(const ChosenMode& mode) {
   return entry;
 }
 
-bool isSameMatch(const V4l2DeviceInfo& a, const V4l2DeviceInfo& b) {
-  return a.driver == b.driver && a.card == b.card && a.busInfo == b.busInfo;
-}
-
 class CameraProbe {
  public:
   CameraProbe(const std::shared_ptr<V4l2Api>& kernel, const DeviceRoots& roots, std::vector<std::string>* lines)
@@ -212,9 +208,7 @@ class CameraProbe {
     DiagnosticErrorPtr error;
     const std::optional<VideoNodeDetails> details = detailsOf(kernel_, node, &error);
     if (!details) return tellProblem(*error);
-    const auto isLikeIt = [&node](const V4l2DeviceInfo& other) {
-      return other.kind == VideoNodeKind::kCamera && other.problem == nullptr && isSameMatch(other, node);
-    };
+    const std::optional<VideoNodeMatch> match = matchOf(node);
     const std::vector<VideoFormat>& formats = details->formats;
     const bool isTaken = cameras_.size() == kPorts.size();
     const auto mode = modeFor(isTaken ? 0 : kPorts.at(cameras_.size()).formatIndex, formats);
@@ -222,12 +216,14 @@ class CameraProbe {
       tell("    unsuitable: its driver reports no format, or no usable size");
     } else if (node.driver.empty() && node.card.empty() && node.busInfo.empty()) {
       tell("    unsuitable: its driver reports nothing that a binding could use to identify it");
-    } else if (std::ranges::count_if(nodes_, isLikeIt) > 1) {
-      tell("    unsuitable: another camera has the same driver, card and bus, so a binding cannot distinguish them");
+    } else if (!match) {
+      tell(
+          "    unsuitable: another camera has the same driver, card, bus and device, so a binding cannot distinguish "
+          "them");
     } else if (isTaken) {
       tell("    suitable, but all ports are taken; use it instead of another camera in the binding below");
     } else {
-      bind(node, *mode, formats);
+      bind(*match, *mode, formats);
     }
     if (mode && !mode->hasDefaultRate) {
       tell("    Its formats have no size at 30 frames a second, the rate that the camera diagnostics use.");
@@ -239,13 +235,32 @@ class CameraProbe {
     }
   }
 
-  void bind(const V4l2DeviceInfo& node, const ChosenMode& mode, const std::vector<VideoFormat>& formats) {
+  // The shortest match that selects only this camera: what the driver reports, then the USB interface, then the place
+  // in sysfs. Nothing if there is none.
+  std::optional<VideoNodeMatch> matchOf(const V4l2DeviceInfo& node) const {
+    const auto textIn = [](const std::string& text) { return text.empty() ? std::nullopt : std::optional(text); };
+    VideoNodeMatch match{textIn(node.driver), textIn(node.card), textIn(node.busInfo), {}, {}};
+    const auto isOnly = [&] {
+      return std::ranges::count_if(nodes_, [&](const V4l2DeviceInfo& other) {
+               return other.kind == node.kind && matches(other, match);
+             }) == 1;
+    };
+    if (isOnly()) return match;
+    match.usbInterface = node.usbInterface;
+    if (isOnly()) return match;
+    match.path = textIn(node.device);
+    return isOnly() ? std::optional(match) : std::nullopt;
+  }
+
+  void bind(const VideoNodeMatch& node, const ChosenMode& mode, const std::vector<VideoFormat>& formats) {
     const auto [port, formatIndex] = kPorts.at(cameras_.size());
     tell("    suitable: " + std::string(port) + " in the binding below; check which camera it really is");
     Json match = Json::object();
-    if (!node.driver.empty()) match["driver"] = node.driver;
-    if (!node.card.empty()) match["card"] = node.card;
-    if (!node.busInfo.empty()) match["busInfo"] = node.busInfo;
+    if (node.driver) match["driver"] = *node.driver;
+    if (node.card) match["card"] = *node.card;
+    if (node.busInfo) match["busInfo"] = *node.busInfo;
+    if (node.usbInterface) match["usbInterface"] = *node.usbInterface;
+    if (node.path) match["path"] = *node.path;
     Json camera = {{"node", std::move(match)}, {"size", sizeEntry(mode)}};
     // Index 0 is that of a stream whose format was never set.
     for (const std::uint32_t index : std::set{std::uint32_t{0}, formatIndex}) {
@@ -258,14 +273,30 @@ class CameraProbe {
   }
 
   void tellMetadata(const V4l2DeviceInfo& node) const {
-    for (const V4l2DeviceInfo& camera : nodes_) {
-      if (camera.kind != VideoNodeKind::kCamera || camera.busInfo != node.busInfo || camera.problem != nullptr)
-        continue;
-      return tell("    metadata of " + camera.path.string() +
-                  ", which is on the same bus; a binding's \"metadata\" "
-                  "can use it, with the fields of its buffers");
+    const V4l2DeviceInfo* const camera = cameraOf(node);
+    if (camera == nullptr) return tell("    metadata, but no camera is on the same bus");
+    tell("    metadata of " + camera->path.string() +
+         ", which is on the same bus; a binding's \"metadata\" can use it, with the fields of its buffers");
+    if (node.usbInterface && camera->usbInterface == node.usbInterface) {
+      tell(formatMessage("    Both are of USB interface %@; add \"usbInterface\" to their nodes.", *node.usbInterface));
     }
-    tell("    metadata, but no camera is on the same bus");
+  }
+
+  // The camera of the same device, or else of the same bus. Drivers make a camera's node before that of its metadata,
+  // so of several it is the last one before.
+  const V4l2DeviceInfo* cameraOf(const V4l2DeviceInfo& metadata) const {
+    const V4l2DeviceInfo* found = nullptr;
+    bool isSameDevice = false;
+    bool isBefore = true;
+    for (const V4l2DeviceInfo& node : nodes_) {
+      if (&node == &metadata) isBefore = false;
+      if (node.kind != VideoNodeKind::kCamera || node.problem != nullptr || node.busInfo != metadata.busInfo) continue;
+      const bool isOfDevice = !node.device.empty() && node.device == metadata.device;
+      if (found != nullptr && (isOfDevice ? isSameDevice && !isBefore : isSameDevice || !isBefore)) continue;
+      found = &node;
+      isSameDevice = isOfDevice;
+    }
+    return found;
   }
 
   const std::shared_ptr<V4l2Api>& kernel_;

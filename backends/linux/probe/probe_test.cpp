@@ -89,7 +89,7 @@ TEST_F(ProbeTest, BindsFiveCamerasToTheFivePorts) {
   EXPECT_THAT(told, Contains(HasSubstr("all ports are taken")));
   ASSERT_EQ(binding_.cameras.size(), 5U);
   EXPECT_EQ(binding_.cameras[0].port, "BackFacingCamera");
-  EXPECT_EQ(binding_.cameras[0].node, (VideoNodeMatch{"fake", "fake camera", "fake:0"}));
+  EXPECT_EQ(binding_.cameras[0].node, (VideoNodeMatch{"fake", "fake camera", "fake:0", {}, {}}));
   EXPECT_EQ(binding_.cameras[4].port, "FrontFacingInfraredCamera");
   EXPECT_EQ(binding_.cameras[4].node.busInfo, "fake:4");
   ASSERT_EQ(binding_.groups.size(), 2U);
@@ -238,6 +238,54 @@ TEST_F(ProbeTest, TellsWhichCameraMetadataAreOf) {
   EXPECT_THAT(told, Contains(HasSubstr("metadata of DEV/video0, which is on the same bus")));
   EXPECT_THAT(told, Contains("    metadata, but no camera is on the same bus"));
   EXPECT_EQ(binding_.cameras.size(), 1U);
+}
+
+// Two streams of one USB device, each with its metadata, and one on another device.
+FakeNode usbNode(FakeNode node, const std::string& device, std::optional<std::uint32_t> interface) {
+  node.device = device;
+  node.usbInterface = interface;
+  return node;
+}
+
+TEST_F(ProbeTest, DistinguishesTheStreamsOfOneDevice) {
+  kernel_->add(0, usbNode(fakeCamera("usb-1"), "usb1/1-1/1-1:1.0", 0));
+  kernel_->add(1, usbNode(fakeMetadata("usb-1"), "usb1/1-1/1-1:1.0", 0));
+  kernel_->add(2, usbNode(fakeCamera("usb-1"), "usb1/1-1/1-1:1.2", 10));
+  kernel_->add(3, usbNode(fakeMetadata("usb-1"), "usb1/1-1/1-1:1.2", 10));
+  kernel_->add(4, usbNode(fakeCamera("board"), "platform/left", std::nullopt));
+  kernel_->add(5, usbNode(fakeCamera("board"), "platform/right", std::nullopt));
+  const std::vector<std::string> told = lines();
+  ASSERT_EQ(binding_.cameras.size(), 4U);
+  EXPECT_EQ(binding_.cameras[0].node, (VideoNodeMatch{"fake", "fake camera", "usb-1", 0, {}}));
+  EXPECT_EQ(binding_.cameras[1].node, (VideoNodeMatch{"fake", "fake camera", "usb-1", 10, {}}));
+  EXPECT_EQ(binding_.cameras[2].node,
+            (VideoNodeMatch{"fake", "fake camera", "board", {}, "/sys/devices/platform/left"}));
+  EXPECT_THAT(told, Contains("  DEV/video2 (driver fake, card fake camera, bus usb-1, USB interface 10)"));
+  EXPECT_THAT(told, Contains(HasSubstr("metadata of DEV/video0, which is on the same bus")));
+  EXPECT_THAT(told, Contains(HasSubstr("metadata of DEV/video2, which is on the same bus")));
+  EXPECT_THAT(told, Contains("    Both are of USB interface 10; add \"usbInterface\" to their nodes."));
+
+  const std::vector<V4l2DeviceInfo> nodes = videoNodes(kernel_, kernel_->roots());
+  for (const CameraBinding& camera : binding_.cameras) {
+    DiagnosticErrorPtr error;
+    EXPECT_TRUE(findVideoNode(nodes, VideoNodeKind::kCamera, camera.node, camera.port, &error)) << camera.port;
+  }
+  VideoNodeMatch metadata = binding_.cameras[1].node;
+  EXPECT_EQ(findVideoNode(nodes, VideoNodeKind::kMetadata, metadata, "", nullptr)->path.filename(), "video3");
+  metadata.usbInterface = 1;
+  DiagnosticErrorPtr error;
+  EXPECT_FALSE(findVideoNode(nodes, VideoNodeKind::kMetadata, metadata, "P", &error));
+  EXPECT_THAT(error->localizedDescription(), HasSubstr("bus usb-1, USB interface 1; there are "));
+}
+
+TEST_F(ProbeTest, GivesMetadataToTheLastCameraBeforeIfTheDeviceTellsNothing) {
+  kernel_->add(0, fakeCamera("fake:0"));
+  kernel_->add(1, fakeMetadata("fake:0"));
+  kernel_->add(2, fakeCamera("fake:0"));
+  kernel_->add(3, fakeMetadata("fake:0"));
+  const std::vector<std::string> told = lines();
+  EXPECT_THAT(told, Contains(HasSubstr("metadata of DEV/video0")));
+  EXPECT_THAT(told, Contains(HasSubstr("metadata of DEV/video2")));
 }
 
 TEST_F(ProbeTest, TellsOfHidDevices) {

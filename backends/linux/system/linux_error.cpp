@@ -31,7 +31,8 @@ void failLinux(DiagnosticErrorPtr* error, LinuxErrorCode code, std::string messa
     *error = errorWithMessage(LinuxErrorDomain, static_cast<std::int64_t>(code), std::move(message), nullptr);
 }
 
-void failSystemCall(DiagnosticErrorPtr* error, std::string_view call, std::string_view object, int number) {
+void failSystemCall(DiagnosticErrorPtr* error, std::string_view call, std::string_view object, int number,
+                    std::string_view hint) {
   std::string message(call);
   message += " on ";
   message += object;
@@ -40,6 +41,8 @@ void failSystemCall(DiagnosticErrorPtr* error, std::string_view call, std::strin
   message += " (";
   message += errorName(number);
   message += ")";
+  if (!hint.empty()) message += ": ";
+  message += hint;
   failLinux(error, codeOf(number), std::move(message));
 }
 

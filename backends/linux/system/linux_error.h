@@ -47,6 +47,8 @@ bool refuseLinux(DiagnosticErrorPtr* error, LinuxErrorCode code, MessageFormat<A
 // Stores an error for a call that failed with `number` (errno). The number determines the code: EACCES and EPERM are
 // kNoAccess, EBUSY is kBusy, ENODEV and ENXIO are kDeviceGone, all others are kSystemCall. The message is "CALL on
 // OBJECT failed: TEXT (NAME)", for example "VIDIOC_STREAMON on /dev/video0 failed: Invalid argument (EINVAL)".
-void failSystemCall(DiagnosticErrorPtr* error, std::string_view call, std::string_view object, int number);
+// `hint`, if there is one, follows after a colon.
+void failSystemCall(DiagnosticErrorPtr* error, std::string_view call, std::string_view object, int number,
+                    std::string_view hint = {});
 
 }  // namespace quazor

@@ -10,6 +10,7 @@
 
 #include <gtest/gtest.h>
 
+#include <array>
 #include <cerrno>
 #include <chrono>
 #include <cstdlib>
@@ -60,7 +61,7 @@ const std::vector<ControlValue> kOff{{0, 5}, {1, 0}};
 
 std::unique_ptr<ControlGuard> guardOf(const Device& device) {
   int number = -1;
-  std::unique_ptr<ControlGuard> guard = startProjectorGuard(device.path(), kOff, &note, &number);
+  std::unique_ptr<ControlGuard> guard = startProjectorGuard({device.path()}, kOff, &note, &number);
   EXPECT_EQ(number, 0);
   return guard;
 }
@@ -212,7 +213,7 @@ TEST(ProjectorGuardTest, ACopyOfItsProcessDoesNotKeepItAlive) {
 
 TEST(ProjectorGuardTest, ADeviceThatCannotBeOpenedIsRefused) {
   int number = 0;
-  EXPECT_EQ(startProjectorGuard("/nonexistent/video0", kOff, &note, &number), nullptr);
+  EXPECT_EQ(startProjectorGuard({"/nonexistent/video0"}, kOff, &note, &number), nullptr);
   EXPECT_EQ(number, ENOENT);
 }
 
@@ -227,7 +228,7 @@ TEST(ProjectorGuardTest, ASystemWithoutFurtherDescriptorsIsRefused) {
   const auto refused = [&](std::size_t left) {
     for (std::size_t i = 0; i < left; ++i) ::close(held[held.size() - 1 - i]);
     int number = 0;
-    EXPECT_EQ(startProjectorGuard(device.path(), kOff, &note, &number), nullptr) << left;
+    EXPECT_EQ(startProjectorGuard({device.path()}, kOff, &note, &number), nullptr) << left;
     for (std::size_t i = 0; i < left; ++i) held[held.size() - 1 - i] = ::open("/dev/null", O_RDONLY);
     return number;
   };
@@ -236,6 +237,48 @@ TEST(ProjectorGuardTest, ASystemWithoutFurtherDescriptorsIsRefused) {
   EXPECT_EQ(refused(2), EMFILE) << "the connection";
   for (const int one : held) ::close(one);
   ::setrlimit(RLIMIT_NOFILE, &before);
+}
+
+TEST(ProjectorGuardTest, AnotherDeviceAtThePathIsRefused) {
+  const Device device;
+  const Device other;
+  const int opened = ::open(device.path().c_str(), O_RDWR);
+  int number = 0;
+  EXPECT_EQ(startProjectorGuard({other.path(), opened}, kOff, &note, &number), nullptr);
+  EXPECT_EQ(number, ENODEV);
+  EXPECT_EQ(startProjectorGuard({"/dev/null", opened}, kOff, &note, &number), nullptr);
+  EXPECT_NE(startProjectorGuard({device.path(), opened}, kOff, &note, &number), nullptr);
+  ::close(opened);
+  EXPECT_EQ(other.content(), "");
+}
+
+// Runs in a copy of this process: closes all descriptors but three, and returns how many of five others remain.
+int remainingAfter(RangeCloser closer) {
+  const pid_t copy = ::fork();
+  if (copy == 0) {
+    const GuardDescriptors kept{::dup(0), ::dup(0), ::dup(0)};
+    std::array<int, 5> others{};
+    for (int& one : others) one = ::dup(0);
+    others[4] = ::dup2(0, 200);
+    closeAllBut(kept, closer);
+    int remaining = 0;
+    for (const int one : others) remaining += ::fcntl(one, F_GETFD) >= 0 ? 1 : 0;
+    const bool all = ::fcntl(kept.connection, F_GETFD) >= 0 && ::fcntl(kept.guarded, F_GETFD) >= 0 &&
+                     ::fcntl(kept.device, F_GETFD) >= 0;
+    ::_exit(all ? remaining : 100);
+  }
+  int status = 0;
+  ::waitpid(copy, &status, 0);
+  return WEXITSTATUS(status);
+}
+
+TEST(ProjectorGuardTest, ItClosesAllOtherDescriptorsAlsoWithoutCloseRange) {
+  EXPECT_EQ(remainingAfter(&closeRange), 0);
+  EXPECT_EQ(remainingAfter([](unsigned int, unsigned int) {
+              errno = ENOSYS;
+              return -1;
+            }),
+            0);
 }
 
 bool endsCopies = false;
@@ -249,7 +292,7 @@ TEST(ProjectorGuardTest, OneThatIsEndedBeforeItIsReadyIsRefused) {
             0);
   endsCopies = true;
   int number = 0;
-  EXPECT_EQ(startProjectorGuard(device.path(), kOff, &note, &number), nullptr);
+  EXPECT_EQ(startProjectorGuard({device.path()}, kOff, &note, &number), nullptr);
   endsCopies = false;
   EXPECT_EQ(number, ECHILD);
   EXPECT_EQ(childOf(::getpid()), 0) << "no process is left";

@@ -21,6 +21,10 @@ class SystemVideoKernel final : public V4l2Api {
     return uninterrupted([&] { return ::open(path.c_str(), O_RDWR | O_NONBLOCK | O_CLOEXEC); });
   }
 
+  int openForQueries(const std::string& path) override {
+    return uninterrupted([&] { return ::open(path.c_str(), O_RDONLY | O_NONBLOCK | O_CLOEXEC); });
+  }
+
   void close(int descriptor) override { ::close(descriptor); }
 
   int lock(int descriptor) override {
@@ -72,9 +76,9 @@ class SystemVideoKernel final : public V4l2Api {
     return std::chrono::seconds(time.tv_sec) + std::chrono::nanoseconds(time.tv_nsec);
   }
 
-  std::unique_ptr<ControlGuard> guardControls(const std::string& path, const std::vector<ControlValue>& off,
-                                              int* number) override {
-    return startProjectorGuard(path, off, &setVideoControl, number);
+  std::unique_ptr<ControlGuard> guardControls(const std::string& path, int descriptor,
+                                              const std::vector<ControlValue>& off, int* number) override {
+    return startProjectorGuard({path, descriptor}, off, &setVideoControl, number);
   }
 };
 

@@ -43,6 +43,9 @@ class V4l2Api {
 
   // Opens a device for reading and writing, without blocking calls. Returns the descriptor.
   virtual int open(const std::string& path) = 0;
+  // Opens a device for queries only. A driver may refuse some calls on such a descriptor, and a user needs only the
+  // permission to read.
+  virtual int openForQueries(const std::string& path) = 0;
   virtual void close(int descriptor) = 0;
   // Locks the device for this descriptor among all callers of this function; -EWOULDBLOCK if it is locked.
   virtual int lock(int descriptor) = 0;
@@ -61,10 +64,10 @@ class V4l2Api {
   // The clock of buffer time stamps (CLOCK_MONOTONIC).
   virtual std::chrono::nanoseconds now() = 0;
 
-  // A guard that sets `off`, in this order, on the device at `path`. Returns null and an error number in `number` on
-  // failure.
-  virtual std::unique_ptr<ControlGuard> guardControls(const std::string& path, const std::vector<ControlValue>& off,
-                                                      int* number) = 0;
+  // A guard that sets `off`, in this order, on the device at `path`, which must be the one that is open with
+  // `descriptor`. Returns null and an error number in `number` on failure: ENODEV if it is another device.
+  virtual std::unique_ptr<ControlGuard> guardControls(const std::string& path, int descriptor,
+                                                      const std::vector<ControlValue>& off, int* number) = 0;
 };
 
 // Repeats a system call while signals interrupt it. Returns its result, or the negated error number.

@@ -173,8 +173,8 @@ TEST(UninterruptedTest, ACallThatSignalsInterruptIsMadeAgainAndTellsItsErrorNumb
 
 TEST_F(SystemVideoKernelTest, GuardsDevices) {
   int number = 0;
-  EXPECT_NE(kernel_->guardControls(path_, {{1, 0}}, &number), nullptr);
-  EXPECT_EQ(kernel_->guardControls("/nonexistent/video0", {}, &number), nullptr);
+  EXPECT_NE(kernel_->guardControls(path_, -1, {{1, 0}}, &number), nullptr);
+  EXPECT_EQ(kernel_->guardControls("/nonexistent/video0", -1, {}, &number), nullptr);
   EXPECT_EQ(number, ENOENT);
 }
 

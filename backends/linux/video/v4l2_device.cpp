@@ -1,6 +1,7 @@
 #include "backends/linux/video/v4l2_device.h"
 
 #include "backends/linux/system/linux_error.h"
+#include "backends/linux/video/control_names.h"
 #include "base/text/hexadecimal.h"
 #include "contract/message_format.h"
 
@@ -59,17 +60,41 @@ bool takes(const VideoControl& control, std::int64_t value) {
 
 ControlValue valueFor(const VideoControl& control, std::int64_t value) { return {control.id, value, is64Bit(control)}; }
 
-std::shared_ptr<V4l2Device> V4l2Device::open(std::shared_ptr<V4l2Api> kernel, const std::string& path,
-                                             DiagnosticErrorPtr* error) {
-  const int descriptor = kernel->open(path);
+std::shared_ptr<V4l2Device> V4l2Device::opened(std::shared_ptr<V4l2Api> kernel, const std::string& path, int descriptor,
+                                               DiagnosticErrorPtr* error) {
   if (descriptor < 0) {
     failSystemCall(error, "open", path, -descriptor);
     return nullptr;
   }
   std::shared_ptr<V4l2Device> node(new V4l2Device(std::move(kernel), path, descriptor));
-  if (!node->call(VIDIOC_QUERYCAP, "VIDIOC_QUERYCAP", &node->capability_, error)) return nullptr;
-  node->listControls();
+  return node->call(VIDIOC_QUERYCAP, "VIDIOC_QUERYCAP", &node->capability_, error) ? node : nullptr;
+}
+
+std::shared_ptr<V4l2Device> V4l2Device::open(std::shared_ptr<V4l2Api> kernel, const std::string& path,
+                                             DiagnosticErrorPtr* error) {
+  const int descriptor = kernel->open(path);
+  std::shared_ptr<V4l2Device> node = opened(std::move(kernel), path, descriptor, error);
+  if (node != nullptr) node->listControls();
   return node;
+}
+
+std::shared_ptr<V4l2Device> V4l2Device::open(std::shared_ptr<V4l2Api> kernel, const V4l2DeviceInfo& info,
+                                             DiagnosticErrorPtr* error) {
+  std::shared_ptr<V4l2Device> node = open(std::move(kernel), info.path.string(), error);
+  if (node == nullptr ||
+      (fixedText(node->capability_.driver) == info.driver && fixedText(node->capability_.card) == info.card &&
+       fixedText(node->capability_.bus_info) == info.busInfo)) {
+    return node;
+  }
+  refuseLinux(error, LinuxErrorCode::kDeviceGone, "%@ was replaced by another device before it was opened.",
+              textOf(info));
+  return nullptr;
+}
+
+std::shared_ptr<V4l2Device> V4l2Device::inspect(std::shared_ptr<V4l2Api> kernel, const std::string& path,
+                                                DiagnosticErrorPtr* error) {
+  const int descriptor = kernel->openForQueries(path);
+  return opened(std::move(kernel), path, descriptor, error);
 }
 
 V4l2Device::V4l2Device(std::shared_ptr<V4l2Api> kernel, std::string path, int descriptor)
@@ -206,6 +231,13 @@ bool V4l2Device::setFormat(const VideoMode& mode, DiagnosticErrorPtr* error) {
          call(VIDIOC_S_FMT, "VIDIOC_S_FMT", &wanted, error) && isGranted(wanted.fmt.pix);
 }
 
+std::optional<MetadataFormat> V4l2Device::metadataFormat() const {
+  v4l2_format format{};
+  format.type = V4L2_BUF_TYPE_META_CAPTURE;
+  if (call(VIDIOC_G_FMT, &format) != 0) return std::nullopt;
+  return MetadataFormat{fourccText(format.fmt.meta.dataformat), format.fmt.meta.buffersize};
+}
+
 std::optional<FrameInterval> V4l2Device::interval(DiagnosticErrorPtr* error) const {
   v4l2_streamparm parameters{};
   parameters.type = V4L2_BUF_TYPE_VIDEO_CAPTURE;
@@ -304,6 +336,9 @@ std::optional<VideoControl> V4l2Device::describe(std::uint32_t id, DiagnosticErr
 const VideoControl* V4l2Device::control(std::string_view name, DiagnosticErrorPtr* error) const {
   const auto found = std::ranges::find(controls_, name, &VideoControl::name);
   if (found != controls_.end()) return &*found;
+  const std::optional<std::uint32_t> id = controlIdOf(name);
+  const VideoControl* const other = id ? controlOfId(*id) : nullptr;
+  if (other != nullptr) return other;
   const std::string undescribed = undescribedControls();
   refuseLinux(error, LinuxErrorCode::kNotSupported, "%@ has no control \"%@\"%@.", path_, name,
               undescribed.empty() ? "" : "; its driver does not describe the controls " + undescribed);
@@ -367,8 +402,15 @@ int V4l2Device::call(unsigned long request, void* argument) const {
 
 bool V4l2Device::call(unsigned long request, std::string_view name, void* argument, DiagnosticErrorPtr* error) const {
   const int result = call(request, argument);
-  if (result != 0) failSystemCall(error, name, path_, result);
+  if (result != 0) failSystemCall(error, name, path_, result, hintFor(result));
   return result == 0;
+}
+
+// What an error number means that usually says something else.
+std::string_view V4l2Device::hintFor(int number) const {
+  if (number != ENOSPC || !fixedText(capability_.bus_info).starts_with("usb-")) return {};
+  return "the USB bus has too little bandwidth left for this stream. Use a smaller size, a lower rate, a compressed "
+         "format or another bus.";
 }
 
 }  // namespace quazor

@@ -20,6 +20,12 @@
 
 namespace quazor {
 
+// The format of a metadata node.
+struct MetadataFormat {
+  std::string fourcc;
+  std::uint32_t bytes = 0;  // the size of its buffers
+};
+
 // What to set with V4l2Device::setFormat().
 struct VideoMode {
   std::uint32_t index = 0;            // the FormatIndex, for messages; the driver's own index if there is no code
@@ -36,6 +42,12 @@ class V4l2Device final {
   // Returns null and an error if the device cannot be opened or its driver does not respond.
   static std::shared_ptr<V4l2Device> open(std::shared_ptr<V4l2Api> kernel, const std::string& path,
                                           DiagnosticErrorPtr* error);
+  // The same for the node that was found as `info`. Fails (kDeviceGone) if its path now belongs to another device.
+  static std::shared_ptr<V4l2Device> open(std::shared_ptr<V4l2Api> kernel, const V4l2DeviceInfo& info,
+                                          DiagnosticErrorPtr* error);
+  // Opens the device only for queries, without a list of its controls.
+  static std::shared_ptr<V4l2Device> inspect(std::shared_ptr<V4l2Api> kernel, const std::string& path,
+                                             DiagnosticErrorPtr* error);
   V4l2Device(const V4l2Device&) = delete;
   V4l2Device& operator=(const V4l2Device&) = delete;
   ~V4l2Device();
@@ -57,6 +69,8 @@ class V4l2Device final {
   // Sets the format and frame size. Fails (kNotSupported), without changing anything, if the driver has no such format
   // or would use another size.
   bool setFormat(const VideoMode& mode, DiagnosticErrorPtr* error);
+  // The format of a metadata node; nothing if the driver does not report it.
+  std::optional<MetadataFormat> metadataFormat() const;
   // The current time between frames; nothing and an error if the driver cannot report it.
   std::optional<FrameInterval> interval(DiagnosticErrorPtr* error) const;
   // Requests an interval and changes it to the one that the driver has set. Returns 0 or the error number, which is
@@ -86,6 +100,9 @@ class V4l2Device final {
 
  private:
   V4l2Device(std::shared_ptr<V4l2Api> kernel, std::string path, int descriptor);
+  static std::shared_ptr<V4l2Device> opened(std::shared_ptr<V4l2Api> kernel, const std::string& path, int descriptor,
+                                            DiagnosticErrorPtr* error);
+  std::string_view hintFor(int number) const;
 
   struct UndescribedControl {
     std::uint32_t id = 0;  // of the last control before the end of the list, if `endsList`

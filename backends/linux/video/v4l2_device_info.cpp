@@ -3,6 +3,8 @@
 #include "backends/linux/system/linux_error.h"
 #include "backends/linux/video/v4l2_device.h"
 
+#include <sys/stat.h>
+
 #include <algorithm>
 #include <charconv>
 #include <fstream>
@@ -30,8 +32,40 @@ std::string firstLineOf(const std::filesystem::path& file) {
   return line;
 }
 
+// As on the running system, whatever the folder of sysfs is.
+std::string deviceOf(const std::filesystem::path& entry, const std::filesystem::path& sysfs) {
+  std::error_code problem;
+  const std::filesystem::path device = std::filesystem::canonical(entry / "device", problem);
+  if (problem) return {};
+  return (std::filesystem::path("/sys") / device.lexically_relative(std::filesystem::canonical(sysfs, problem)))
+      .string();
+}
+
+std::optional<std::uint32_t> usbInterfaceOf(const std::filesystem::path& entry) {
+  const std::string line = firstLineOf(entry / "device" / "bInterfaceNumber");
+  std::uint32_t number = 0;
+  const auto [end, problem] = std::from_chars(line.data(), line.data() + line.size(), number, 16);
+  if (problem != std::errc() || end != line.data() + line.size()) return std::nullopt;
+  return number;
+}
+
+NodeIdentity identityOf(const std::filesystem::path& entry) {
+  struct stat status {};
+  if (::stat(entry.c_str(), &status) != 0) return {};
+  return {status.st_ino, std::int64_t{status.st_ctim.tv_sec} * 1'000'000'000 + status.st_ctim.tv_nsec};
+}
+
+// Null if the node is not known, or was not usable.
+const V4l2DeviceInfo* knownNode(const std::vector<V4l2DeviceInfo>& known, const V4l2DeviceInfo& node) {
+  const auto isSame = [&node](const V4l2DeviceInfo& one) {
+    return one.path == node.path && one.identity == node.identity && one.problem == nullptr;
+  };
+  const auto found = std::ranges::find_if(known, isSame);
+  return found == known.end() ? nullptr : &*found;
+}
+
 void ask(const std::shared_ptr<V4l2Api>& kernel, V4l2DeviceInfo& node) {
-  const auto opened = V4l2Device::open(kernel, node.path.string(), &node.problem);
+  const auto opened = V4l2Device::inspect(kernel, node.path.string(), &node.problem);
   if (opened == nullptr) return;
   const v4l2_capability& capability = opened->capability();
   node.driver = fixedText(capability.driver);
@@ -41,7 +75,10 @@ void ask(const std::shared_ptr<V4l2Api>& kernel, V4l2DeviceInfo& node) {
   node.kind = opened->kind();
 }
 
-bool fits(const std::optional<std::string>& wanted, const std::string& text) { return !wanted || *wanted == text; }
+template <class Wanted, class Found>
+bool fits(const std::optional<Wanted>& wanted, const Found& found) {
+  return !wanted || found == *wanted;
+}
 
 std::string_view nameOf(VideoNodeKind kind) { return kind == VideoNodeKind::kMetadata ? "metadata node" : "camera"; }
 
@@ -61,7 +98,8 @@ std::vector<const V4l2DeviceInfo*> unopened(const std::vector<V4l2DeviceInfo>& n
 
 }  // namespace
 
-std::vector<V4l2DeviceInfo> videoNodes(const std::shared_ptr<V4l2Api>& kernel, const DeviceRoots& roots) {
+std::vector<V4l2DeviceInfo> videoNodes(const std::shared_ptr<V4l2Api>& kernel, const DeviceRoots& roots,
+                                       const std::vector<V4l2DeviceInfo>& known) {
   std::vector<std::pair<std::uint32_t, V4l2DeviceInfo>> numbered;
   std::error_code problem;
   std::filesystem::directory_iterator entry(roots.sysfs / "class" / "video4linux", problem);
@@ -72,7 +110,14 @@ std::vector<V4l2DeviceInfo> videoNodes(const std::shared_ptr<V4l2Api>& kernel, c
     V4l2DeviceInfo node;
     node.path = roots.dev / name;
     node.systemName = firstLineOf(entry->path() / "name");
-    ask(kernel, node);
+    node.device = deviceOf(entry->path(), roots.sysfs);
+    node.usbInterface = usbInterfaceOf(entry->path());
+    node.identity = identityOf(entry->path());
+    if (const V4l2DeviceInfo* const same = knownNode(known, node)) {
+      node = *same;
+    } else {
+      ask(kernel, node);
+    }
     numbered.emplace_back(*number, std::move(node));
   }
   std::ranges::sort(numbered, {}, [](const auto& one) { return one.first; });
@@ -91,7 +136,8 @@ std::optional<VideoNodeDetails> detailsOf(const std::shared_ptr<V4l2Api>& kernel
 
 bool matches(const V4l2DeviceInfo& node, const VideoNodeMatch& match) {
   return node.problem == nullptr && fits(match.driver, node.driver) && fits(match.card, node.card) &&
-         fits(match.busInfo, node.busInfo);
+         fits(match.busInfo, node.busInfo) && fits(match.usbInterface, node.usbInterface) &&
+         fits(match.path, node.device);
 }
 
 std::optional<V4l2DeviceInfo> findVideoNode(const std::vector<V4l2DeviceInfo>& nodes, VideoNodeKind kind,
@@ -125,7 +171,8 @@ std::optional<V4l2DeviceInfo> findVideoNode(const std::vector<V4l2DeviceInfo>& n
 
 std::string textOf(const V4l2DeviceInfo& node) {
   if (node.problem != nullptr) return node.path.string() + " (" + node.problem->localizedDescription() + ")";
-  return node.path.string() + " (driver " + node.driver + ", card " + node.card + ", bus " + node.busInfo + ")";
+  return node.path.string() + " (driver " + node.driver + ", card " + node.card + ", bus " + node.busInfo +
+         (node.usbInterface ? ", USB interface " + std::to_string(*node.usbInterface) : "") + ")";
 }
 
 std::string textOf(const VideoNodeMatch& match) {
@@ -139,6 +186,8 @@ std::string textOf(const VideoNodeMatch& match) {
   add("driver", match.driver);
   add("card", match.card);
   add("bus", match.busInfo);
+  if (match.usbInterface) add("USB interface", std::to_string(*match.usbInterface));
+  add("path", match.path);
   return text.empty() ? "any" : text;
 }
 

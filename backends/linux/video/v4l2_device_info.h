@@ -49,9 +49,20 @@ enum class VideoNodeKind {
   kOther      // not supported: outputs, radios, and cameras with only read() or several planes
 };
 
+// Tells a node from one that replaced it: the kernel's number of its entry in sysfs, and when the entry was made.
+struct NodeIdentity {
+  std::uint64_t number = 0;
+  std::int64_t made = 0;  // in nanoseconds
+
+  friend bool operator==(const NodeIdentity&, const NodeIdentity&) = default;
+};
+
 struct V4l2DeviceInfo {
+  NodeIdentity identity;
   std::filesystem::path path;  // for example /dev/video0
   std::string systemName;      // the name in sysfs, for example "vivid-000-vid-cap"
+  std::string device;          // the path in sysfs of the device it is part of, "/sys/devices/..."; empty if unknown
+  std::optional<std::uint32_t> usbInterface;  // the number of that device if it is a USB interface
   // The members below are empty if the node cannot be opened; `problem` then gives the reason.
   std::string driver;
   std::string card;
@@ -74,8 +85,10 @@ struct DeviceRoots {
   std::filesystem::path dev = "/dev";
 };
 
-// All video nodes, sorted by number; empty if the machine has none.
-std::vector<V4l2DeviceInfo> videoNodes(const std::shared_ptr<V4l2Api>& kernel, const DeviceRoots& roots = {});
+// All video nodes, sorted by number; empty if the machine has none. Opens only those that are not among `known`, or
+// could not be opened then: opening a node may wake a device that sleeps.
+std::vector<V4l2DeviceInfo> videoNodes(const std::shared_ptr<V4l2Api>& kernel, const DeviceRoots& roots = {},
+                                       const std::vector<V4l2DeviceInfo>& known = {});
 
 // Queries the node's driver. Returns nothing and an error if the node cannot be opened.
 std::optional<VideoNodeDetails> detailsOf(const std::shared_ptr<V4l2Api>& kernel, const V4l2DeviceInfo& node,

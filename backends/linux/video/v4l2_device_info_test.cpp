@@ -30,6 +30,41 @@ TEST(VideoNodesTest, NodesComeByTheirNumbersAndOtherThingsAreNone) {
   EXPECT_EQ(namesOf(videoNodes(kernel, kernel->roots())), (std::vector<std::string>{"video0", "video2", "video10"}));
 }
 
+TEST(VideoNodesTest, ANodeIsOpenedForQueriesOnceUnlessItWasReplacedOrUnusable) {
+  const Kernel kernel = std::make_shared<FakeV4l2Api>();
+  const std::string first = kernel->add(0, fakeCamera("fake:0"));
+  FakeNode closed = fakeCamera("fake:1");
+  closed.openProblem = EACCES;
+  const std::string second = kernel->add(1, closed);
+  const auto queried = [&](const std::string& path) {
+    return kernel->with(path, [](FakeNode& node) { return node.queried; });
+  };
+  std::vector<V4l2DeviceInfo> nodes = videoNodes(kernel, kernel->roots());
+  kernel->with(second, [](FakeNode& node) { return node.openProblem = 0; });
+  nodes = videoNodes(kernel, kernel->roots(), nodes);
+  nodes = videoNodes(kernel, kernel->roots(), nodes);
+  EXPECT_EQ(queried(first), 1);
+  EXPECT_EQ(queried(second), 1) << "as soon as it can be opened";
+  EXPECT_EQ(nodes.at(1).busInfo, "fake:1");
+  std::filesystem::create_directories(kernel->roots().sysfs / "class" / "video4linux" / "video9");  // takes its inode
+  kernel->add(0, fakeCamera("fake:7"));
+  nodes = videoNodes(kernel, kernel->roots(), nodes);
+  EXPECT_EQ(nodes.at(0).busInfo, "fake:7");
+}
+
+TEST(VideoNodesTest, ANodeThatWasReplacedBeforeItIsOpenedIsRefused) {
+  const Kernel kernel = std::make_shared<FakeV4l2Api>();
+  const std::string path = kernel->add(0, fakeCamera("fake:0"));
+  const std::vector<V4l2DeviceInfo> nodes = videoNodes(kernel, kernel->roots());
+  EXPECT_EQ(outcome([&](auto* error) { return V4l2Device::open(kernel, nodes.at(0), error); }), "done");
+  kernel->with(path, [](FakeNode& node) { return node.bus = "fake:1"; });
+  EXPECT_EQ(outcome([&](auto* error) { return V4l2Device::open(kernel, nodes.at(0), error); }),
+            "9 " + path +
+                " (driver fake, card fake camera, bus fake:0) was replaced by another device before it was "
+                "opened.");
+  EXPECT_TRUE(kernel->isIdle());
+}
+
 TEST(VideoNodesTest, ANodeTellsWhatItIsOrWhyItCannotBeOpened) {
   const Kernel kernel = std::make_shared<FakeV4l2Api>();
   kernel->add(0, fakeCamera("fake:0"));
@@ -263,6 +298,30 @@ TEST(OpenedVideoNodeTest, AControlThatTheDriverSetsToAnotherValueIsRefused) {
   EXPECT_EQ(set("Narrow", 98), "done");
   EXPECT_EQ(set("Wide", 1), "6 " + path + ": the driver set the control \"Wide\" to 8589934592 instead of 1.");
   EXPECT_EQ(set("Volatile", 99), "done") << "the device changes it itself";
+}
+
+TEST(OpenedVideoNodeTest, AControlIsFoundByItsNumberAndByItsNameInOtherKernels) {
+  const Kernel kernel = std::make_shared<FakeV4l2Api>();
+  FakeNode camera = fakeCamera("fake:0");
+  camera.controls = {{V4L2_CID_EXPOSURE_AUTO, "Auto Exposure"},
+                     {V4L2_CID_EXPOSURE_ABSOLUTE, "Exposure (Absolute)"},
+                     {V4L2_CID_FOCUS_AUTO, "Focus, Auto"}};
+  const std::string path = kernel->add(0, camera);
+  const auto node = V4l2Device::open(kernel, path, nullptr);
+  const auto idOf = [&](std::string_view name) {
+    const VideoControl* const control = node->control(name, nullptr);
+    return control == nullptr ? 0 : control->id;
+  };
+  EXPECT_EQ(idOf("0x009A0901"), std::uint32_t{V4L2_CID_EXPOSURE_AUTO});
+  EXPECT_EQ(idOf("0x9a0901"), std::uint32_t{V4L2_CID_EXPOSURE_AUTO});
+  EXPECT_EQ(idOf("0x009A0902 "), 0U);
+  EXPECT_EQ(idOf("Auto Exposure"), std::uint32_t{V4L2_CID_EXPOSURE_AUTO});
+  EXPECT_EQ(idOf("Exposure, Auto"), std::uint32_t{V4L2_CID_EXPOSURE_AUTO}) << "the name before Linux 5.14";
+  EXPECT_EQ(idOf("Exposure Time, Absolute"), std::uint32_t{V4L2_CID_EXPOSURE_ABSOLUTE}) << "the name since then";
+  EXPECT_EQ(idOf("Focus, Automatic Continuous"), std::uint32_t{V4L2_CID_FOCUS_AUTO});
+  EXPECT_EQ(idOf("Zoom, Absolute"), 0U) << "the camera has no zoom";
+  EXPECT_EQ(outcome([&](auto* error) { return node->control("0x009A0999", error); }),
+            "5 " + path + " has no control \"0x009A0999\".");
 }
 
 TEST(OpenedVideoNodeTest, AFormatThatTheDriverChangesAsItIsSetIsRefused) {
