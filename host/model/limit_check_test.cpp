@@ -132,7 +132,7 @@ TEST(LimitCheck, HasTheBoundsOfItsConditionInTheUnitOfTheResult) {
       {"A < 5", "", "5 ms open"},           {"A <= 5", "", "5 ms"},
       {"A > 5", "5 ms open", ""},           {"A >= 5", "5 ms", ""},
       {"A == 5 +- 1", "4 ms", "6 ms"},      {"A in [1, 2)", "1 ms", "2 ms open"},
-      {"A in (1, 2]", "1 ms open", "2 ms"},
+      {"A in (1, 2]", "1 ms open", "2 ms"}, {"A == 1e308 +- 1e308", "0 ms", ""},
   };
   const auto textOf = [](const std::shared_ptr<const QZBound>& bound) {
     if (bound == nullptr) return std::string();
