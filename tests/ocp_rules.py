@@ -60,8 +60,8 @@ def measurement_problems(measurement):
 
 
 def verdict_problems(step):
-    """Checks that the diagnosis of a result follows its measurement, those of the user's limits follow it, and all agree
-    with their validators. The result's own validators are the first ones."""
+    """Checks that the diagnosis of a result follows its measurement, those of the user's limits follow it, and all
+    agree with their validators. The result's own validators are the first ones."""
     measurement = {}
     before = {}
     for one in step:

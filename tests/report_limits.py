@@ -1,5 +1,5 @@
-"""Limits of the user in the report formats: parses their canonical text, judges by them, and tells what each format says
-of them.
+"""Limits of the user in the report formats: parses their canonical text, judges by them, and tells what each format
+says of them.
 """
 
 import collections
@@ -101,8 +101,8 @@ def failed_names(record):
 
 
 def rows_of(record, limit_of, name_of=None):
-    """The results, each followed by one row per limit of the user. `limit_of` makes the limit of a row from the label and
-    the bounds, `name_of` the name from those of the result and the limit."""
+    """The results, each followed by one row per limit of the user. `limit_of` makes the limit of a row from the label
+    and the bounds, `name_of` the name from those of the result and the limit."""
     rows = []
     for one, checks in zip(record["results"], record["checks"]):
         rows.append(one)

@@ -1,14 +1,15 @@
-// Generates random runs and writes each of them in every report format, for a reader to compare.
+// Generates random runs and writes each of them in every report format and as a record, for a reader to compare.
 //
 //   report_samples DIRECTORY COUNT SEED
 //
-// Writes one file per format, named after it, to the directory. In it each run is preceded by a line with the length of
-// its report in bytes.
+// Writes one file per format, named after it, and the file "record" to the directory. In them each run is preceded by a
+// line with its length in bytes.
 #include "base/text/utf8.h"
 #include "host/error/host_error.h"
 #include "host/model/judge.h"
 #include "host/model/limit_check.h"
 #include "host/report/report_format.h"
+#include "sample_record.h"
 
 #include <algorithm>
 #include <cmath>
@@ -401,11 +402,14 @@ class Generator {
 bool writeSamples(const std::filesystem::path& directory, std::size_t count, std::uint64_t seed) {
   std::vector<std::ofstream> files;
   for (const Format format : kFormats) files.emplace_back(directory / nameOf(format), std::ios::binary);
+  files.emplace_back(directory / "record", std::ios::binary);
   Generator generator(seed);
   for (std::size_t i = 0; i < count; ++i) {
     const auto [run, records, interrupted] = generator.sample();
     for (std::size_t at = 0; at < files.size(); ++at) {
-      const std::string report = reportText(kFormats[at], run, records, interrupted, {true, {}});
+      const std::string report = at < std::size(kFormats)
+                                     ? reportText(kFormats[at], run, records, interrupted, {true, {}})
+                                     : recordOf(run, records, interrupted);
       files[at] << report.size() << '\n' << report;
     }
   }

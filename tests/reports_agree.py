@@ -1,5 +1,5 @@
 #!/usr/bin/env python3
-"""Reads random runs back from every report format, each with its own parser, and compares the contents.
+"""Reads random runs back from every report format and from the record, each with its own parser, and compares them.
 
 usage: reports_agree.py REPORT_SAMPLES
 
@@ -20,6 +20,7 @@ import tempfile
 import xml.etree.ElementTree
 
 import ocp_rules
+import record_reader
 import report_limits
 import report_readers
 from report_readers import blurred, in_xml
@@ -27,7 +28,7 @@ from report_readers import blurred, in_xml
 COUNT = 1000
 SEED = 20261121
 SHOWN = 20
-FORMS = ("text", "json", "csv", "ocp", "junit")
+FORMS = ("text", "json", "csv", "ocp", "junit", "record")
 INTERRUPTION = report_readers.Error("QuazorHostErrorDomain", 11, "it was interrupted")
 SIGNS = ("]]>", "\ufffd", "\uffff", "\\u0000", "\\r", "\u2028", ",")  # as in JSON
 # The samples must contain some of each.
@@ -40,7 +41,8 @@ KINDS = {"a diagnostic: pass", "a diagnostic: fail", "a diagnostic: error", "a d
          *(f"a {kind}, {severity}: {verdict}" for kind in ("number", "interval", "relation")
            for severity, verdicts in (("fail", ("pass", "fail", "error")), ("warn", ("pass", "warn")))
            for verdict in verdicts),
-         "a tolerance", "a tolerance without a bound", "a unit", "a limit on a value that is not finite", *(f"a text with {sign!r}" for sign in SIGNS)}
+         "a record with bytes that are no text", "a tolerance", "a tolerance without a bound", "a unit",
+         "a limit on a value that is not finite", *(f"a text with {sign!r}" for sign in SIGNS)}
 
 
 def trial_text(record, run):
@@ -165,6 +167,7 @@ class Comparison:
         self.count_kinds(of_experiments, records)
         self.check_limits(name, records)
         self.check_verdict(name, json.loads(reports["json"]), records)
+        self.compare_record(name, record_reader.Reader(reports["record"]), run, records, interrupted)
         streams = ocp_rules.streams_of(reports["ocp"], f"{name} ocp", self.found)
         root = xml.etree.ElementTree.fromstring(reports["junit"])
         suites = root.findall("testsuite")
@@ -193,7 +196,7 @@ class Comparison:
         return last > place and records[last]["verdict"] in ("pass", "fail")
 
     def check_limits(self, name, records):
-        """Judges by the limits of the user. Texts that contain U+FFFD may have differed before it replaced their bytes."""
+        """Judges by the limits of the user. Texts with U+FFFD may have differed before it replaced their bytes."""
         for record in records:
             for one, checks in zip(record["results"], record["checks"]):
                 for check in checks:
@@ -300,6 +303,16 @@ class Comparison:
                 self.check(f"{name} {place} csv: stage", got["error stage"], record["error stage"])
             del rows[:count]
         self.check(f"{name} csv: lines left", rows, [])
+
+    def compare_record(self, name, found, run, records, interrupted):
+        self.kinds["a record with bytes that are no text"] += found.has_bytes
+        identity = {key: run[key] for key in record_reader.RUN_KEYS if key in run}
+        self.check(f"{name} record: run", blurred(record_reader.shown(found.run)), blurred(identity))
+        self.check(f"{name} record: end", blurred(record_reader.shown(found.ended)), blurred({"interrupted": interrupted}))
+        self.check(f"{name} record: entries", len(found.records), len(records))
+        for place, (one, record) in enumerate(zip(found.records, records)):
+            self.check_record(f"{name} {place} record", blurred(record_reader.shown(one)),
+                              blurred(record_reader.expected(record)))
 
     def compare_text(self, name, lines, of_experiments, records, interrupted, run):
         for place, record in enumerate(records):

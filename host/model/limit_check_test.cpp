@@ -150,6 +150,16 @@ TEST(LimitCheck, HasTheBoundsOfItsConditionInTheUnitOfTheResult) {
   EXPECT_FALSE(boundsOf(relation.at(0))) << "a comparison of two results has none";
 }
 
+TEST(LimitCheck, ComparesNamesBehindZeroBytes) {
+  using namespace std::string_literals;
+  UserLimit limit = limitFrom("A < 5");
+  limit.result = "A\0B"s;
+  const auto checks =
+      limitChecksOf(limitedRecord({measured("A\0C"s, 1), measured("A", 1), measured("A\0B"s, 1)}, {limit}));
+  ASSERT_EQ(checks.size(), 1U);
+  EXPECT_EQ(checks[0].index, 2U);
+}
+
 TEST(LimitCheck, TakesPatternsInTheOrderOfTheResults) {
   const DiagnosticRecord record =
       limitedRecord({measured("B.Total", 2), measured("A.Total", 1), measured("A.Rest", 0)},
