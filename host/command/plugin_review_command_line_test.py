@@ -127,7 +127,7 @@ class ExampleTest(ReviewCase):
 
 class BadPluginTest(ReviewCase):
     def test_a_sloppy_plug_in(self):
-        findings = self.review(PLUGINS / "sloppy_plugin.so")
+        findings = self.review(PLUGINS.parents[1] / "sloppy_plugins/sloppy_plugin.so")
         for text in ("^name: 'my check' has characters",
                      "^my check: has no summary",
                      "^measure_things, parameter how.many: has no summary",

@@ -4,14 +4,19 @@ import json
 
 from arrived import expect, expect_equal
 
-DIAGNOSTICS = ("CameraSyncDiagnostic.Back", "CameraSyncDiagnostic.Front", "TesselFaultDiagnostic",
-               "TesselTelemonDiagnostic")
+CAMERA_DIAGNOSTICS = ("CameraSyncDiagnostic.Back", "CameraSyncDiagnostic.Front", "SingleCameraDiagnostic")
+TESSEL_DIAGNOSTICS = ("TesselFaultDiagnostic", "TesselTelemonDiagnostic")
+
+
+def expect_verdicts(step, wanted):
+    """Checks the verdicts, by diagnostic, of the run "all"."""
+    expect_equal("the exit code", step.exit_code("all"), 0)
+    verdicts = {entry["name"]: entry["verdict"] for entry in json.loads(step.out("all"))["diagnostics"]}
+    expect_equal("the verdicts", verdicts, wanted)
 
 
 def simulated_phone(step):
-    expect_equal("the exit code", step.exit_code("all"), 0)
-    verdicts = {entry["name"]: entry["verdict"] for entry in json.loads(step.out("all"))["diagnostics"]}
-    expect_equal("the verdicts", verdicts, dict.fromkeys(DIAGNOSTICS, "pass"))
+    expect_verdicts(step, dict.fromkeys(CAMERA_DIAGNOSTICS + TESSEL_DIAGNOSTICS, "pass"))
 
 
 def nothing(step):
@@ -34,6 +39,17 @@ def probe(step):
     expect("Virtual-1" in step.out("probe"), "the probe does not find the display")
     expect_equal("the exit code of a probe without rights", step.exit_code("unprivileged"), 0)
     expect("/dev/video" in step.out("unprivileged"), "the probe without rights does not name the cameras")
+
+
+def probed_cameras(step):
+    expect_equal("the exit code of a probe", step.exit_code("probe"), 0)
+    expect_verdicts(step, dict.fromkeys(CAMERA_DIAGNOSTICS, "pass") | dict.fromkeys(TESSEL_DIAGNOSTICS, "skip"))
+    dropping = step.ran("dropping")
+    missing, gaps = (next(result["value"] for result in dropping["measuredResults"] if result["name"] == name)
+                     for name in ("MissingFrames", "Errors.SequenceGapCount"))
+    expect(gaps > 0, "a fifth of the frames was dropped, and there is no gap in their numbers")
+    expect(abs(missing - gaps) <= 2, f"{gaps} frames are missing by their numbers, {missing} by their times")
+    expect_equal("the verdict while frames are dropped", dropping["verdict"], "fail")
 
 
 def channels(step):

@@ -10,7 +10,8 @@ import tempfile
 from initramfs import Archive, add_program
 
 HERE = pathlib.Path(__file__).resolve().parent
-TARGETS = ("quazor_program", "camera_sensor_diagnostics", "sensor_images", "kernel_guest_programs")
+TARGETS = ("quazor_program", "camera_sensor_diagnostics", "sensor_images", "single_camera",
+           "kernel_guest_programs")
 GUEST_PROGRAMS = "tests/kernel"  # the build directory of the programs for the rig
 
 # Five cameras with one input each and a metadata node. Their node numbers are not in order, because nothing may depend

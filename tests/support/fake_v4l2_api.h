@@ -32,8 +32,8 @@ struct FakeControl {
   std::int64_t value = 0;
   std::uint32_t type = V4L2_CTRL_TYPE_INTEGER;
   std::uint32_t flags = 0;
-  int describeProblem = 0;            // an error number of VIDIOC_QUERY_EXT_CTRL
-  std::optional<std::int64_t> stuck;  // the value that the driver sets whatever is requested
+  int describeProblem = 0;              // an error number of VIDIOC_QUERY_EXT_CTRL
+  std::optional<std::int64_t> stuck{};  // the value that the driver sets whatever is requested
 };
 
 struct FakeSize {

@@ -28,8 +28,9 @@ struct VideoNodeMatch {
   std::optional<std::string> driver;
   std::optional<std::string> card;
   std::optional<std::string> busInfo;
-  std::optional<std::uint32_t> usbInterface;  // the number of the USB interface, for several cameras of one USB device
-  std::optional<std::string> path;            // of the device in sysfs, which changes if it is connected elsewhere
+  std::optional<std::uint32_t>
+      usbInterface{};                 // the number of the USB interface, for several cameras of one USB device
+  std::optional<std::string> path{};  // of the device in sysfs, which changes if it is connected elsewhere
 
   friend bool operator==(const VideoNodeMatch&, const VideoNodeMatch&) = default;
 };
