@@ -60,15 +60,23 @@ def measurement_problems(measurement):
 
 
 def verdict_problems(step):
-    """Checks that each diagnosis follows its measurement and agrees with its validators."""
-    measurement = None
+    """Checks that the diagnosis of a result follows its measurement, those of the user's limits follow it, and all
+    agree with their validators. The result's own validators are the first ones."""
+    measurement = {}
+    before = {}
     for one in step:
-        if "diagnosis" in one and one["diagnosis"]["type"] != "UNKNOWN":
-            validators = (measurement or {}).get("validators", [])
-            holds = all(HOLDS[each["type"]](measurement["value"], each["value"]) for each in validators)
-            if not validators or (one["diagnosis"]["type"] == "PASS") != holds:
-                yield f"diagnosis {one['diagnosis']} of {measurement}"
-        measurement = one.get("measurement")
+        measurement = one.get("measurement", measurement)
+        diagnosis = one.get("diagnosis", {"type": "UNKNOWN"})
+        validators = measurement.get("validators", [])
+        if diagnosis["type"] != "UNKNOWN":
+            of_limit = diagnosis["verdict"].startswith(f"{measurement.get('name')}-limit-")
+            wanted = [each for each in validators if diagnosis["message"].endswith(f", limit {each['name']}")
+                      ] if of_limit else [each for each in validators if each["name"] == validators[0]["name"]]
+            holds = all(HOLDS[each["type"]](measurement["value"], each["value"]) for each in wanted)
+            is_missing = not of_limit and (not wanted or "measurement" not in before)
+            if is_missing or (wanted and (diagnosis["type"] == "PASS") != holds):
+                yield f"diagnosis {diagnosis} of {measurement}"
+        before = one
 
 
 def end_problems(stream):

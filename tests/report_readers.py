@@ -11,6 +11,8 @@ import math
 import re
 import unicodedata
 
+import report_limits
+
 VERDICTS = {("COMPLETE", "PASS"): "pass", ("COMPLETE", "FAIL"): "fail", ("ERROR", "NOT_APPLICABLE"): "error",
             ("SKIP", "NOT_APPLICABLE"): "skip"}
 CSV_HEADER = ("diagnostic,verdict,result,value,unit,limit,lower,lowerOpen,upper,upperOpen,resultVerdict,"
@@ -94,6 +96,9 @@ def read_json(text):
             "results": [
                 Result(each["name"], number(each["value"]), each["unit"], limit_of(each["limit"]), each["verdict"])
                 for each in one.get("measuredResults", [])],
+            "checks": [
+                [report_limits.Check(*(check[key] for key in ("limit", "name", "severity", "source", "verdict")))
+                 for check in each.get("userLimits", [])] for each in one.get("measuredResults", [])],
             "measurements": [
                 (name, number(each["value"]), each["unit"]) for name, each in one["measurements"].items()],
             "errors": errors_of(one["error"]),
@@ -116,9 +121,10 @@ def split_symptom(error):
 
 
 def ocp_limit(measurement):
-    if "validators" in measurement:
+    validators = [one for one in measurement.get("validators", []) if not report_limits.is_label(one["name"])]
+    if validators:
         bounds = {}
-        for one in measurement["validators"]:
+        for one in validators:
             which = "lower" if one["type"].startswith("GREATER") else "upper"
             bounds[which] = (number(one["value"]), not one["type"].endswith("OR_EQUAL"))
             name = one["name"]
@@ -138,7 +144,7 @@ def ocp_results(stream):
         if "measurement" in one:
             it = one["measurement"]
             results.append(Result(it["name"], number(it["value"]), it.get("unit", ""), ocp_limit(it), "none"))
-        if "diagnosis" in one:
+        if "diagnosis" in one and not report_limits.is_of_limit(one, results[-1].name):
             kind = one["diagnosis"]["type"].lower()
             if one["diagnosis"]["verdict"] != f"{results[-1].name}-{kind}":
                 raise ValueError(f"diagnosis {one['diagnosis']} of {results[-1]}")
@@ -160,12 +166,14 @@ def read_ocp(stream):
         "summary": stream.start["metadata"].get("summary", ""),
         "verdict": VERDICTS.get((stream.end["status"], stream.end["result"])),
         "results": ocp_results(stream),
+        "checks": report_limits.read_ocp(stream.of_step("analysis")),
         "measurements": [(one["name"][len("raw."):], number(one["value"]), one.get("unit", "")) for one in raw],
         "skip": skip_of(stream.start["metadata"]),
         "attempt": stream.start["metadata"].get("attempt"),
         "repetition": stream.start["metadata"].get("repetition"),
         "errors": [split_symptom(one) for one in stream.all_of("error")],
-        "log": [(levels[one["severity"]], one["message"]) for one in stream.all_of("log")],
+        "log": [(levels[one["severity"]], one["message"]) for one in stream.all_of("log")
+                if one["severity"] != "WARNING"],
         "parameters": {half: {name: number(value) for name, value in parameters.get(half, {}).items()}
                        for half in ("experiment", "analysis")},
         "seed": stream.start["metadata"]["seed"],
@@ -179,6 +187,7 @@ def read_ocp(stream):
 
 def expected_of_ocp(record):
     """After an error the state of the hardware is unknown."""
+    record = record | {"checks": report_limits.expected_of_ocp(record)}
     if record["skip"]:
         kind, reason = record["skip"]
         return record | {"log": [*record["log"], ("default", f"{kind}: {reason}")]}
@@ -220,7 +229,7 @@ def junit_result(case, verdict_of_suite):
 
     limit = Limit(it["limit"], bound("lower"), bound("upper")) if "limit" in it else None
     result = Result(case.get("name"), number(it["value"]), it["unit"], limit, it["verdict"])
-    allowed = {"pass": [], "none": [], "fail": ["failure"], "error": ["error"]}[result.verdict]
+    allowed = {"pass": [], "none": [], "warn": [], "fail": ["failure"], "error": ["error"]}[result.verdict]
     finite = all(math.isfinite(float(it[key])) for key in ("value", "lower", "upper") if key in it)
     if result.verdict in ("pass", "fail") and not finite:
         raise ValueError(f"{result} cannot be judged")
@@ -280,8 +289,10 @@ def read_junit(suite):
         raise ValueError("a parameter without its source")
     if derived_verdict(suite) != it["verdict"]:
         raise ValueError(f"it says {it['verdict']}, and its test cases {derived_verdict(suite)}")
-    # If results cannot be judged, their cases have the errors, and the first of them is that of the run.
+    # If results cannot be judged, their cases have the errors. That of the run is the first of a limit of its own, if
+    # there is one, else the first of a limit of the user.
     unjudged = [one for one in cases if one.find("error") is not None and "value" in properties_of(one)]
+    unjudged.sort(key=lambda one: report_limits.is_label(properties_of(one).get("limit", "")))
     if len(errors) > 1 or bool(errors or unjudged) != (it["verdict"] == "error"):
         raise ValueError(f"{len(errors)} errors of the run")
     for one in errors or unjudged[:1]:
@@ -311,7 +322,7 @@ def expected_of_junit(record):
         "skip": record["skip"] and (record["skip"][0], in_xml(record["skip"][1])),
         "results": [one._replace(name=in_xml(one.name), unit=in_xml(one.unit),
                                  limit=one.limit and one.limit._replace(name=in_xml(one.limit.name)))
-                    for one in record["results"]],
+                    for one in report_limits.rows_of(record, Limit, lambda name, label: f"{name}: {label}")],
         "measurements": [(in_xml(name), value, in_xml(unit)) for name, value, unit in record["measurements"]],
         "parameters": {half: {in_xml(name): value for name, value in values.items()}
                        for half, values in record["parameters"].items()},
@@ -358,7 +369,7 @@ def read_csv(rows, header):
 
 def expected_of_csv(record):
     """No limit looks like a limit without name and bounds, and there is only one error."""
-    results = [one._replace(limit=one.limit or NO_LIMIT) for one in record["results"]]
+    results = [one._replace(limit=one.limit or NO_LIMIT) for one in report_limits.rows_of(record, Limit)]
     return {"name": record["name"], "verdict": record["verdict"], "results": results, "errors": record["errors"][:1],
             "skip": record["skip"], "attempt": record["attempt"], "repetition": record["repetition"]}
 
@@ -416,6 +427,8 @@ def text_limit(text):
     """Parses a limit and its name."""
     if text == "-":
         return None
+    if report_limits.is_label(text):
+        return Limit(text, None, None)
     one = r"(-?[0-9.e+-]+|-?inf|nan)"
     found = re.fullmatch(f"(?s)(.*): (?:no bounds|= {one}|(?:(>=?) {one})?(?:, )?(?:(<=?) {one})?)", text)
     name, exact, above, low, below, high = found.groups()
@@ -476,7 +489,7 @@ def expected_of_text(record, of_experiments):
         "name": printable(record["name"]),
         "summary": ["  " + printable(line) for line in record["summary"].split("\n")],
         "results": [one._replace(name=shown(one.name), unit=shown(one.unit), limit=of_limit(one.limit))
-                    for one in record["results"]],
+                    for one in report_limits.rows_of(record, lambda label, *_: Limit(label, None, None))],
         "measurements": [(shown(name), value, shown(unit)) for name, value, unit in record["measurements"]]
         if of_experiments else [],
         "auxiliaryData": of_experiments and record["auxiliaryData"],

@@ -1,14 +1,18 @@
-// Generates random runs and writes each of them in every report format, for a reader to compare.
+// Generates random runs and writes each of them in every report format and as a record, for a reader to compare.
 //
 //   report_samples DIRECTORY COUNT SEED
 //
-// Writes one file per format, named after it, to the directory. In it each run is preceded by a line with the length of
-// its report in bytes.
+// Writes one file per format, named after it, and the file "record" to the directory. In them each run is preceded by a
+// line with its length in bytes.
+#include "base/text/utf8.h"
 #include "host/error/host_error.h"
 #include "host/model/judge.h"
+#include "host/model/limit_check.h"
 #include "host/report/report_format.h"
+#include "sample_record.h"
 
 #include <algorithm>
+#include <cmath>
 #include <cstdint>
 #include <cstdlib>
 #include <filesystem>
@@ -137,7 +141,12 @@ class Generator {
     if (oneIn(4)) sample.run.attempts = 2 + upTo(2);
     if (oneIn(4)) sample.run.repetitions = 2 + upTo(2);
     sample.run.acceptFlaky = sample.run.attempts > 0 && oneIn(2);
-    for (std::size_t i = upTo(4); i > 0; --i) sample.run.names.push_back(text());
+    for (std::size_t i = upTo(4); i > 0; --i) sample.run.names.push_back(name(i));
+    resultNames_ = {patternless(name(1001)), patternless(name(1002)), patternless(name(1003))};
+    if (oneIn(2)) {
+      for (std::size_t i = upTo(4); i > 0; --i) sample.run.limits.push_back(limit(sample.run.names));
+    }
+    limits_ = sample.run.limits;
     const std::size_t rounds = std::max<std::size_t>(sample.run.repetitions, 1);
     for (std::size_t round = 1; round <= rounds; ++round) {
       for (const std::string& name : sample.run.names) addAttempts(sample, name, round);
@@ -152,9 +161,8 @@ class Generator {
     const RunStarted& run = sample.run;
     const std::size_t attempts = std::max<std::size_t>(run.attempts, 1);
     for (std::size_t attempt = 1; attempt <= attempts; ++attempt) {
-      DiagnosticRecord record = run.ofExperiments ? experiment() : diagnostic();
+      DiagnosticRecord record = run.ofExperiments ? experiment(name) : diagnostic(name);
       if (attempt > 1 && record.skip) continue;
-      record.name = name;
       record.trial = {run.attempts == 0 ? 0 : attempt, run.attempts, run.repetitions == 0 ? 0 : round, run.repetitions};
       sample.records.push_back(std::move(record));
       if (sample.records.back().verdict != Verdict::kError) return;
@@ -186,6 +194,48 @@ class Generator {
     return oneIn(3) ? QZUnit::unitWithSymbol("") : QZUnit::unitWithSymbol(text());
   }
 
+  // Names with different numbers do not become equal when a report replaces invalid bytes.
+  std::string name(std::size_t number) {
+    const std::string name = text();
+    return findInvalidUtf8(name) ? std::to_string(number) + name : name;
+  }
+
+  // A name that is not a pattern.
+  static std::string patternless(std::string name) {
+    return name.empty() || name.find_first_of("*?[") != std::string::npos ? "frames" : name;
+  }
+
+  // A limit of the user on results of this run, or on one that does not exist.
+  UserLimit limit(const std::vector<std::string>& diagnostics) {
+    UserLimit limit;
+    if (oneIn(3)) limit.diagnostic = "*";
+    if (!diagnostics.empty() && oneIn(3)) limit.diagnostic = patternless(diagnostics[upTo(diagnostics.size() - 1)]);
+    limit.result = oneIn(8) ? "*" : resultNames_[upTo(2)];
+    limit.condition = condition();
+    if (oneIn(2)) limit.name = text();
+    if (oneIn(2)) limit.severity = LimitSeverity::kWarn;
+    limit.source = oneIn(2) ? "command line" : "profile " + text();
+    limit.onlyIfSelected = oneIn(2);
+    return limit;
+  }
+
+  decltype(UserLimit::condition) condition() {
+    constexpr LimitOperator kOperators[] = {LimitOperator::kLess, LimitOperator::kLessOrEqual, LimitOperator::kGreater,
+                                            LimitOperator::kGreaterOrEqual, LimitOperator::kEqual};
+    std::optional<std::string> ofNumber;
+    if (oneIn(3)) ofNumber = oneIn(4) ? text() : "frames";
+    if (oneIn(3)) {
+      const auto [lower, upper] = std::minmax({number(), number()});
+      return IntervalCondition{lower, upper, lower < upper && oneIn(2), lower < upper && oneIn(2), ofNumber};
+    }
+    const LimitOperator comparison = oneOf(kOperators);
+    double tolerance = comparison == LimitOperator::kEqual && oneIn(2) ? std::abs(number()) : 0;
+    const bool isHuge = tolerance > 0 && oneIn(4);  // beyond it there is no bound
+    if (isHuge) tolerance = std::numeric_limits<double>::max();
+    if (oneIn(2)) return RelationCondition{comparison, resultNames_[upTo(2)], tolerance};
+    return NumberCondition{comparison, isHuge ? tolerance : number(), tolerance, ofNumber};
+  }
+
   DiagnosticErrorPtr error() {
     DiagnosticErrorPtr error;
     for (std::size_t i = oneIn(20) ? 60 : 1 + upTo(2); i > 0; --i) {
@@ -215,10 +265,10 @@ class Generator {
   }
 
   // A result that passes, fails, is informational or, if `wild`, cannot be judged.
-  QZMeasuredResult result(bool wild, bool mayFail) {
+  QZMeasuredResult result(std::size_t place, bool wild, bool mayFail) {
     const QZUnit& ofValue = unit();
     const double value = wild && oneIn(3) ? oneOf(kNotFinite) : number();
-    QZMeasuredResult result(text(), Measurement(value, ofValue));
+    QZMeasuredResult result(oneIn(3) ? resultNames_[upTo(2)] : name(place), Measurement(value, ofValue));
     if (oneIn(4)) return result;
     QZLimit limit(text());
     const QZUnit& ofBound = wild && oneIn(3) ? unit() : ofValue;
@@ -274,9 +324,10 @@ class Generator {
     if (oneIn(5)) record.auxiliaryData.set("numbers", Array{oneOf(kNotFinite), number(), 36.6F, Bytes{0xA5}});
   }
 
-  DiagnosticRecord begun() {
+  DiagnosticRecord begun(const std::string& name) {
     DiagnosticRecord record;
-    record.name = text();
+    record.name = name;
+    record.limits = limitsFor(name, limits_);
     record.summary = text();
     record.experimentName = text();
     record.parameters.experiment = parameters();
@@ -286,16 +337,16 @@ class Generator {
     return record;
   }
 
-  DiagnosticRecord experiment() {
-    DiagnosticRecord record = begun();
+  DiagnosticRecord experiment(const std::string& name) {
+    DiagnosticRecord record = begun(name);
     record.experimentOnly = true;
     if (oneIn(5)) return skipped(std::move(record));
     goThrough(record);
     return ended(std::move(record));
   }
 
-  DiagnosticRecord diagnostic() {
-    DiagnosticRecord record = begun();
+  DiagnosticRecord diagnostic(const std::string& name) {
+    DiagnosticRecord record = begun(name);
     record.analysisName = text();
     record.parameters.analysis = parameters();
     if (oneIn(5)) return skipped(std::move(record));
@@ -303,7 +354,7 @@ class Generator {
       const bool wild = oneIn(6);
       const bool mayFail = oneIn(3);
       for (std::size_t i = oneIn(40) ? 300 : upTo(6); i > 0; --i) {
-        record.measuredResults.push_back(judgeResult(result(wild, mayFail)));
+        record.measuredResults.push_back(judgeResult(result(i, wild, mayFail)));
       }
     }
     return ended(std::move(record));
@@ -333,28 +384,32 @@ class Generator {
     for (std::size_t i = upTo(2); i > 0; --i) sample.run.names.push_back(text());
     if (!oneIn(3)) return;
     // The run was interrupted during a diagnostic that has a record.
-    DiagnosticRecord record = begun();
+    DiagnosticRecord record = begun(sample.interrupted->empty() ? text() : *sample.interrupted);
     record.experimentOnly = sample.run.ofExperiments;
     addStage(record, Stage::kRun, false);
     record.error = hostError(HostErrorCode::kInterrupted, "it was interrupted");
     record.errorStage = Stage::kRun;
-    if (!sample.interrupted->empty()) record.name = *sample.interrupted;
     sample.interrupted = record.name;
     sample.records.push_back(ended(std::move(record)));
   }
 
   std::mt19937_64 random_;
+  std::vector<std::string> resultNames_;  // those that limits of the user and relations name
+  std::vector<UserLimit> limits_;         // of the run
   Date now_{std::chrono::seconds(1'795'220'000)};
 };
 
 bool writeSamples(const std::filesystem::path& directory, std::size_t count, std::uint64_t seed) {
   std::vector<std::ofstream> files;
   for (const Format format : kFormats) files.emplace_back(directory / nameOf(format), std::ios::binary);
+  files.emplace_back(directory / "record", std::ios::binary);
   Generator generator(seed);
   for (std::size_t i = 0; i < count; ++i) {
     const auto [run, records, interrupted] = generator.sample();
     for (std::size_t at = 0; at < files.size(); ++at) {
-      const std::string report = reportText(kFormats[at], run, records, interrupted, {true, {}});
+      const std::string report = at < std::size(kFormats)
+                                     ? reportText(kFormats[at], run, records, interrupted, {true, {}})
+                                     : recordOf(run, records, interrupted);
       files[at] << report.size() << '\n' << report;
     }
   }

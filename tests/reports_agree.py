@@ -1,5 +1,5 @@
 #!/usr/bin/env python3
-"""Reads random runs back from every report format, each with its own parser, and compares the contents.
+"""Reads random runs back from every report format and from the record, each with its own parser, and compares them.
 
 usage: reports_agree.py REPORT_SAMPLES
 
@@ -20,13 +20,15 @@ import tempfile
 import xml.etree.ElementTree
 
 import ocp_rules
+import record_reader
+import report_limits
 import report_readers
 from report_readers import blurred, in_xml
 
 COUNT = 1000
 SEED = 20261121
 SHOWN = 20
-FORMS = ("text", "json", "csv", "ocp", "junit")
+FORMS = ("text", "json", "csv", "ocp", "junit", "record")
 INTERRUPTION = report_readers.Error("QuazorHostErrorDomain", 11, "it was interrupted")
 SIGNS = ("]]>", "\ufffd", "\uffff", "\\u0000", "\\r", "\u2028", ",")  # as in JSON
 # The samples must contain some of each.
@@ -35,7 +37,12 @@ KINDS = {"a diagnostic: pass", "a diagnostic: fail", "a diagnostic: error", "a d
          "a skip: not-reached", "a run with tags", "a run with a serial number", "a run with repetitions", "a flaky diagnostic",
          "an error that was accepted", "a result that varied", "an interrupted run without a record", "an interrupted run with a record", "a run that never began",
          "no results", "many results", "a deep error", "a value that is not finite", "a limit without bounds",
-         "a result: pass", "a result: fail", "a result: error", "a result: none", *(f"a text with {sign!r}" for sign in SIGNS)}
+         "a result: pass", "a result: fail", "a result: error", "a result: none",
+         *(f"a {kind}, {severity}: {verdict}" for kind in ("number", "interval", "relation")
+           for severity, verdicts in (("fail", ("pass", "fail", "error")), ("warn", ("pass", "warn")))
+           for verdict in verdicts),
+         "a record with bytes that are no text", "a tolerance", "a tolerance without a bound", "a unit",
+         "a limit on a value that is not finite", *(f"a text with {sign!r}" for sign in SIGNS)}
 
 
 def trial_text(record, run):
@@ -65,6 +72,8 @@ def counts_line(records, of_experiments):
     many = "" if len(ended) == 1 else "s"
     noun = "run" if any(one["repetition"] for one in records) else "experiment" if of_experiments else "diagnostic"
     more = "".join(f", {count[key]} {word}" for key, word in (("skip", "skipped"), ("flaky", "flaky")) if count[key])
+    if warnings := report_limits.warnings_in(records):
+        more += f", {warnings} warning{'' if warnings == 1 else 's'}"
     if of_experiments:
         return (f"{len(ended)} {noun}{many}: {count['pass']} returned a result, "
                 f"{count['error']} ended in an error{more}")
@@ -79,7 +88,7 @@ def failure_line(record):
     elif record["errors"]:
         what = f"{record['errors'][0].domain} code {record['errors'][0].code}"
     else:
-        names = list(dict.fromkeys(one.name for one in record["results"] if one.verdict == "fail"))
+        names = report_limits.failed_names(record)
         what = ", ".join(names[:3]) + (f" and {len(names) - 3} more" if len(names) > 3 else "")
     word = {"fail": "FAIL ", "error": "ERROR", "skip": "SKIP ", "pass": "FLAKY"}[record["verdict"]]
     name = report_readers.printable(record["name"])
@@ -156,7 +165,9 @@ class Comparison:
         for record in records:
             record["trial"] = trial_text(record, run)
         self.count_kinds(of_experiments, records)
+        self.check_limits(name, records)
         self.check_verdict(name, json.loads(reports["json"]), records)
+        self.compare_record(name, record_reader.Reader(reports["record"]), run, records, interrupted)
         streams = ocp_rules.streams_of(reports["ocp"], f"{name} ocp", self.found)
         root = xml.etree.ElementTree.fromstring(reports["junit"])
         suites = root.findall("testsuite")
@@ -183,6 +194,23 @@ class Comparison:
         last = next(at for at in range(place, len(records))
                     if at + 1 == len(records) or (records[at + 1]["attempt"] or 1) == 1)
         return last > place and records[last]["verdict"] in ("pass", "fail")
+
+    def check_limits(self, name, records):
+        """Judges by the limits of the user. Texts with U+FFFD may have differed before it replaced their bytes."""
+        for record in records:
+            for one, checks in zip(record["results"], record["checks"]):
+                for check in checks:
+                    condition = report_limits.condition_of(check.text)
+                    kind = "relation" if condition.other else "number" if condition.operator else "interval"
+                    self.kinds[f"a {kind}, {check.severity}: {check.verdict}"] += 1
+                    self.kinds["a tolerance"] += condition.tolerance > 0
+                    self.kinds["a tolerance without a bound"] += (
+                        kind == "number" and condition.operator == "==" and None in (condition.lower, condition.upper))
+                    self.kinds["a unit"] += condition.unit is not None
+                    self.kinds["a limit on a value that is not finite"] += one.value in ("nan", "inf", "-inf")
+                    if "\ufffd" not in check.text + one.unit:
+                        expected = report_limits.verdict_of(check, one, record["results"])
+                        self.check(f"{name} json: {one.name}: {check.text}", check.verdict, expected)
 
     def check_verdict(self, name, document, records):
         run = document["run"]
@@ -268,13 +296,23 @@ class Comparison:
         header = rows.pop(0)
         self.check(f"{name} csv: header", header, [*report_readers.CSV_HEADER, *of_skips, *trials])
         for place, record in enumerate(records):
-            count = max(1, len(record["results"]))
+            count = max(1, len(record["results"]) + sum(map(len, record["checks"])))
             got = report_readers.read_csv(rows[:count], header)
             self.check_record(f"{name} {place} csv", got, report_readers.expected_of_csv(record))
             if record["error stage"] is not None:
                 self.check(f"{name} {place} csv: stage", got["error stage"], record["error stage"])
             del rows[:count]
         self.check(f"{name} csv: lines left", rows, [])
+
+    def compare_record(self, name, found, run, records, interrupted):
+        self.kinds["a record with bytes that are no text"] += found.has_bytes
+        identity = {key: run[key] for key in record_reader.RUN_KEYS if key in run}
+        self.check(f"{name} record: run", blurred(record_reader.shown(found.run)), blurred(identity))
+        self.check(f"{name} record: end", blurred(record_reader.shown(found.ended)), blurred({"interrupted": interrupted}))
+        self.check(f"{name} record: entries", len(found.records), len(records))
+        for place, (one, record) in enumerate(zip(found.records, records)):
+            self.check_record(f"{name} {place} record", blurred(record_reader.shown(one)),
+                              blurred(record_reader.expected(record)))
 
     def compare_text(self, name, lines, of_experiments, records, interrupted, run):
         for place, record in enumerate(records):

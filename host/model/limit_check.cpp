@@ -136,7 +136,8 @@ std::optional<QZLimit> boundsOf(const LimitCheck& check) {
   QZLimit bounds(labelOf(check.limit));
   const QZUnit& unit = check.result.measurement().unit();
   const auto bound = [&unit](double value, bool open) {
-    return std::make_shared<const QZBound>(Measurement(value, unit), open);
+    // A tolerance may reach beyond the largest double; nothing lies there.
+    return std::isfinite(value) ? std::make_shared<const QZBound>(Measurement(value, unit), open) : nullptr;
   };
   if (const auto* const interval = std::get_if<IntervalCondition>(&check.limit.condition)) {
     bounds.setLowerBound(bound(interval->lower, interval->lowerOpen));

@@ -41,7 +41,8 @@ std::vector<LimitCheck> limitChecksOf(const DiagnosticRecord& record);
 // Those of `checks` that compare the result at `index`.
 std::vector<LimitCheck> checksOfResult(const std::vector<LimitCheck>& checks, std::size_t index);
 
-// The limit as plain bounds in the unit of the result, with labelOf() as its name; nothing for a relation.
+// The limit as plain bounds in the unit of the result, with labelOf() as its name; nothing for a relation. All bounds
+// are finite.
 std::optional<QZLimit> boundsOf(const LimitCheck& check);
 
 // The limits that fit no result in any of the records, although a diagnostic for which they are meant ended without an

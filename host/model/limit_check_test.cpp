@@ -132,7 +132,7 @@ TEST(LimitCheck, HasTheBoundsOfItsConditionInTheUnitOfTheResult) {
       {"A < 5", "", "5 ms open"},           {"A <= 5", "", "5 ms"},
       {"A > 5", "5 ms open", ""},           {"A >= 5", "5 ms", ""},
       {"A == 5 +- 1", "4 ms", "6 ms"},      {"A in [1, 2)", "1 ms", "2 ms open"},
-      {"A in (1, 2]", "1 ms open", "2 ms"},
+      {"A in (1, 2]", "1 ms open", "2 ms"}, {"A == 1e308 +- 1e308", "0 ms", ""},
   };
   const auto textOf = [](const std::shared_ptr<const QZBound>& bound) {
     if (bound == nullptr) return std::string();
@@ -148,6 +148,16 @@ TEST(LimitCheck, HasTheBoundsOfItsConditionInTheUnitOfTheResult) {
   }
   const auto relation = limitChecksOf(limitedRecord({measured("A", 3), measured("B", 4)}, {limitFrom("A < B")}));
   EXPECT_FALSE(boundsOf(relation.at(0))) << "a comparison of two results has none";
+}
+
+TEST(LimitCheck, ComparesNamesBehindZeroBytes) {
+  using namespace std::string_literals;
+  UserLimit limit = limitFrom("A < 5");
+  limit.result = "A\0B"s;
+  const auto checks =
+      limitChecksOf(limitedRecord({measured("A\0C"s, 1), measured("A", 1), measured("A\0B"s, 1)}, {limit}));
+  ASSERT_EQ(checks.size(), 1U);
+  EXPECT_EQ(checks[0].index, 2U);
 }
 
 TEST(LimitCheck, TakesPatternsInTheOrderOfTheResults) {

@@ -189,7 +189,8 @@ bool contains(const std::vector<Diagnostic>& diagnostics, const Diagnostic& want
 }
 
 bool matchesName(const std::string& pattern, const std::string& name) {
-  return pattern == name || fnmatch(pattern.c_str(), name.c_str(), FNM_NOESCAPE) == 0;
+  // fnmatch() would compare two names only up to a zero byte.
+  return pattern == name || (isPattern(pattern) && fnmatch(pattern.c_str(), name.c_str(), FNM_NOESCAPE) == 0);
 }
 
 bool isPattern(const std::string& text) { return text.find_first_of("*?[") != std::string::npos; }

@@ -19,8 +19,8 @@ std::string resultCountsText(const DiagnosticRecord& record);
 void printShortRecord(std::ostream& out, const DiagnosticRecord& record, bool colour, std::size_t nameWidth);
 
 // Prints a line for each diagnostic that did not pass or that passed only after an error, with the results that failed
-// or with its error, and then the
-// command that explains them; nothing if all passed. The command names only what `isExplained` accepts.
+// or with its error, and then the command that explains them; nothing if all passed. The command names only what
+// `isExplained` accepts.
 void printFailures(std::ostream& out, const std::vector<DiagnosticRecord>& records, bool colour,
                    const std::function<bool(const std::string& topic)>& isExplained);
 
