@@ -42,4 +42,17 @@ std::string didYouMean(std::string_view name, const std::vector<std::string>& ca
   return nearest ? "; did you mean '" + *nearest + "'?" : std::string();
 }
 
+std::string didYouMeanPath(std::string_view name, const std::vector<std::string>& candidates) {
+  std::vector<std::string> lastParts;
+  std::string same;
+  for (const std::string& candidate : candidates) {
+    lastParts.push_back(candidate.substr(candidate.rfind('/') + 1));
+    if (lastParts.back() == name) same += (same.empty() ? "'" : " or '") + candidate + "'";
+  }
+  if (!same.empty()) return "; did you mean " + same + "?";
+  const bool hasFolder = name.find('/') != std::string_view::npos;
+  const std::optional<std::string> nearest = hasFolder ? std::nullopt : nearestName(name, lastParts);
+  return nearest ? didYouMeanPath(*nearest, candidates) : didYouMean(name, candidates);
+}
+
 }  // namespace quazor

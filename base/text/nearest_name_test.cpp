@@ -53,5 +53,18 @@ TEST(DidYouMean, EndsASentenceOrSaysNothing) {
   EXPECT_EQ(didYouMean("x", {"timeout", "duration"}), "");
 }
 
+TEST(NearestName, MayLackItsFolder) {
+  const std::vector<std::string> names = {"a/device_missing", "b/device_missing", "b/frames_dropped", "healthy"};
+  EXPECT_EQ(didYouMeanPath("frames_dropped", names), "; did you mean 'b/frames_dropped'?");
+  EXPECT_EQ(didYouMeanPath("device_missing", names), "; did you mean 'a/device_missing' or 'b/device_missing'?");
+  EXPECT_EQ(didYouMeanPath("devise_missing", names), "; did you mean 'a/device_missing' or 'b/device_missing'?");
+  EXPECT_EQ(didYouMeanPath("frame_dropt", names), "; did you mean 'b/frames_dropped'?");
+  EXPECT_EQ(didYouMeanPath("camera/frame_dropt", {"sync/frames_dropped"}), "");
+  EXPECT_EQ(didYouMeanPath("b/frame_dropped", names), "; did you mean 'b/frames_dropped'?");
+  EXPECT_EQ(didYouMeanPath("healty", names), "; did you mean 'healthy'?");
+  EXPECT_EQ(didYouMeanPath("x", names), "");
+  EXPECT_EQ(didYouMeanPath("x", {}), "");
+}
+
 }  // namespace
 }  // namespace quazor

@@ -152,11 +152,14 @@ void addParameterOptions(CLI::App& command, RawOptions& raw) {
   command
       .add_option(
           "--profile", raw.profile,
-          "Read parameter values and limits from this file or installed profile, for example strict; 'none' skips "
-          "the default profile")
+          "Read parameter values and limits from this file or installed profile, for example strict, instead of the "
+          "default profile; 'none' skips it")
       ->type_name("FILE|NAME");
-  addRepeatable(command, "--parameters", raw.parameterFiles,
-                "Read more parameter values from this file, which has the format of a profile; repeatable", "FILE");
+  addRepeatable(
+      command, "--parameters", raw.parameterFiles,
+      "Read more parameter values and limits from this file or installed profile, in addition to --profile or "
+      "the default profile; repeatable",
+      "FILE|NAME");
   addRepeatable(command, "--set", raw.settings,
                 "Set a parameter of every selected diagnostic that declares it; repeatable. The environment variable "
                 "QUAZOR_SET holds settings in the same form, separated by spaces. Precedence, highest first: --set, "
@@ -453,7 +456,7 @@ std::vector<OptionSummary> optionsOfCommand(const std::string& command) {
   return options;
 }
 
-std::optional<Options> parseCommandLine(const std::vector<std::string>& arguments, std::ostream& out, std::ostream& err,
+std::optional<Options> parseCommandLine(const std::vector<std::string>& given, std::ostream& out, std::ostream& err,
                                         ExitCode* code) {
   CLI::App app("Hardware diagnostics for a phone's cameras and sensors.", "quazor");
   RawOptions raw;
@@ -461,11 +464,12 @@ std::optional<Options> parseCommandLine(const std::vector<std::string>& argument
   if (isNarrow) app.get_formatter()->column_width(kNarrowColumn);
   declareCommands(app, raw);
   *code = ExitCode::kUsage;
-  if (arguments.empty()) {
+  if (given.empty()) {
     err << app.help();
     return std::nullopt;
   }
   try {
+    const std::vector<std::string> arguments = withHelpAsOption(given);
     refuseUnknownCommand(arguments);
     // CLI11 expects the arguments in reverse order.
     std::vector<std::string> texts = marked(arguments);
@@ -478,7 +482,8 @@ std::optional<Options> parseCommandLine(const std::vector<std::string>& argument
     app.exit(answer, out, err);
     *code = ExitCode::kAllPassed;
   } catch (const CLI::ParseError& refusal) {
-    err << "quazor: " << printable(withoutMarks(refusal.what())) << "\nRun 'quazor --help' for usage.\n";
+    err << "quazor: " << printable(withoutMarks(refusal.what())) << "\nRun '" << helpCommandFor(given)
+        << "' for usage.\n";
     *code = ExitCode::kUsage;
   } catch (const CommandError& refusal) {
     err << "quazor: " << printable(refusal.what()) << '\n';

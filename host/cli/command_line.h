@@ -43,6 +43,9 @@ inline constexpr std::string_view kCommandNames[] = {"list",    "describe",   "r
                                                      "analyze", "diff",       "explain", "doctor",     "selftest",
                                                      "phone",   "completion", "new"};
 
+// 'quazor help' and 'quazor help NAME' are 'quazor --help' and 'quazor NAME --help'.
+inline constexpr const char* kHelpWord = "help";
+
 // A parsed command line. Options that the command does not have keep their defaults.
 struct Options {
   // Positional arguments: diagnostics or experiments, topics, a shell, "probe", "list" and phones, a folder.
@@ -51,14 +54,14 @@ struct Options {
   std::vector<ParameterOverride> settings;
   std::vector<UserLimit> limits;
   OrderedMap<std::string> tags;
-  std::vector<std::filesystem::path> parameterFiles;
-  std::vector<std::filesystem::path> records;  // to read
-  std::filesystem::path record;                // to write, or the folder for it; empty: none
-  std::filesystem::path failedOf;              // the record for --only failed; empty: that of the last run
-  std::filesystem::path profile;               // empty: the installed one
-  std::optional<Profile> recorded;             // the parameters of the run that is repeated
-  std::filesystem::path phone;                 // a scenario, or linux:BINDING; empty: the installed healthy one
-  Choice choice;                               // of what runs
+  std::vector<std::filesystem::path> parameterFiles;  // or names of profiles
+  std::vector<std::filesystem::path> records;         // to read
+  std::filesystem::path record;                       // to write, or the folder for it; empty: none
+  std::filesystem::path failedOf;                     // the record for --only failed; empty: that of the last run
+  std::filesystem::path profile;                      // empty: the default one
+  std::optional<Profile> recorded;                    // the parameters of the run that is repeated
+  std::filesystem::path phone;                        // a scenario, or linux:BINDING; empty: the installed healthy one
+  Choice choice;                                      // of what runs
   ReportOptions report;
   std::vector<DeadlineSetting> deadlines;
   std::chrono::nanoseconds grace = kDefaultGrace;

@@ -1,7 +1,11 @@
 #include "host/cli/help_texts.h"
 
+#include "host/cli/command_line.h"
+#include "host/error/exit_code.h"
+
 #include <algorithm>
 #include <cstddef>
+#include <iterator>
 
 namespace quazor {
 
@@ -121,6 +125,22 @@ std::string helpFooter(std::string_view command) {
     if (one.commands.empty() || hasWord(one.commands, command)) codes += codeText(one.code, one.meaning);
   }
   return footerOf(examples, codes);
+}
+
+std::vector<std::string> withHelpAsOption(const std::vector<std::string>& arguments) {
+  if (arguments.empty() || arguments.front() != kHelpWord) return arguments;
+  if (arguments.size() > 2) {
+    throw CommandError(ExitCode::kUsage, "'quazor help' takes the name of one command, as in 'quazor help run'");
+  }
+  if (arguments.size() < 2 || arguments.back() == "--help" || arguments.back() == "-h") return {"--help"};
+  return {arguments.back(), "--help"};
+}
+
+std::string helpCommandFor(const std::vector<std::string>& arguments) {
+  const std::string& first = arguments.front();
+  const bool isCommand =
+      std::find(std::begin(kCommandNames), std::end(kCommandNames), first) != std::end(kCommandNames);
+  return "quazor " + (isCommand ? first + " " : "") + "--help";
 }
 
 }  // namespace quazor

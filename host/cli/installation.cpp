@@ -132,9 +132,16 @@ fs::path Installation::plugin(const fs::path& name) const {
 
 fs::path Installation::pluginTemplate() const { return data_ / "plugin_template"; }
 
-fs::path Installation::defaultProfile() const { return data_ / "profiles" / "default.json"; }
+fs::path Installation::defaultProfile() const {
+  const fs::path named = namedProfile("default");
+  return named.empty() ? data_ / "profiles" / "default.json" : named;
+}
 
 fs::path Installation::profile(const fs::path& name) const { return dataFile("profiles", name); }
+
+fs::path Installation::namedProfile(const std::string& name) const { return namedFile("profiles", name); }
+
+std::vector<std::string> Installation::profileNames() const { return dataNames("profiles"); }
 
 fs::path Installation::defaultScenario() const { return data_ / "scenarios" / "healthy.json"; }
 
@@ -176,7 +183,11 @@ fs::path Installation::namedFile(const char* kind, const fs::path& name) const {
 fs::path Installation::dataFile(const char* kind, const fs::path& name) const {
   if (isThere(name) || name.is_absolute()) return name;
   const fs::path named = namedFile(kind, name);
-  return named.empty() ? name : named;
+  if (!named.empty()) return named;
+  const fs::path bare = name.extension() == ".json" ? fs::path(name).replace_extension() : name;
+  const std::string suggestion = didYouMeanPath(bare.string(), dataNames(kind));
+  if (suggestion.empty()) return name;
+  throw CommandError(ExitCode::kCannotRead, name.string() + ": the file does not exist" + suggestion);
 }
 
 std::vector<std::string> Installation::dataNames(const char* kind) const {

@@ -48,14 +48,20 @@ class Installation {
   std::filesystem::path plugin(const std::filesystem::path& name) const;
   // The folder of the project that `quazor new` copies.
   std::filesystem::path pluginTemplate() const;
+  // The profile `default` in the folders above; that of the installation if there is none, to be told that it is
+  // missing.
   std::filesystem::path defaultProfile() const;
-  // Resolves the argument of `--profile` like scenario(), among the profiles.
+  // Resolves the argument of `--profile` or `--parameters` like scenario(), among the profiles.
   std::filesystem::path profile(const std::filesystem::path& name) const;
+  // The profile of that name in the folders above; empty if there is none.
+  std::filesystem::path namedProfile(const std::string& name) const;
+  std::vector<std::string> profileNames() const;
   std::filesystem::path defaultScenario() const;
   // The folders with explanations, those of the user first.
   std::vector<std::filesystem::path> explanations() const;
   // Resolves the argument of `--phone`: returns `name` if that file exists, else the scenario of that name (for example
-  // "camera_sync/start_refused") in the folders above if there is one, else `name` unchanged.
+  // "camera_sync/start_refused") in the folders above if there is one, else `name` unchanged. Throws
+  // a CommandError (kCannotRead) instead, which suggests them, if there are scenarios with similar names.
   std::filesystem::path scenario(const std::filesystem::path& name) const;
   // The file of a scenario that another one is based on by its name: in the folders above; empty if there is none. The
   // function refers to this object.

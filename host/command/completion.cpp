@@ -67,6 +67,7 @@ class Completer {
     if (option == "--only") return {"failed"};
     if (option == "--log-limit" || option == "--memory") return {"none"};
     if (option == "--phone") return phones();
+    if (option == "--profile" || option == "--parameters") return profiles(option == "--profile");
     if (option == "--plugin") return plugins();
     if (option == "--deadline") {
       std::vector<std::string> stages;
@@ -87,6 +88,12 @@ class Completer {
     return names;
   }
 
+  std::vector<std::string> profiles(bool orNone) const {
+    std::vector<std::string> names = installation_.profileNames();
+    if (orNone) names.emplace_back("none");
+    return names;
+  }
+
   std::vector<std::string> phones() const {
     std::vector<std::string> names = installation_.scenarioNames();
     for (const std::string& name : installation_.bindingNames()) names.push_back(std::string(kLinuxPrefix) + name);
@@ -95,6 +102,7 @@ class Completer {
 
   std::vector<std::string> operands() const {
     const std::string& command = words_.front();
+    if (command == kHelpWord) return {std::begin(kCommandNames), std::end(kCommandNames)};
     if (command == "selftest") return installation_.scenarioNames();
     if (command == "completion") return {"bash", "zsh"};
     if (command == "phone" && words_.size() == 2) return {"list", "probe"};
@@ -155,7 +163,7 @@ std::vector<std::string> completionsOf(const std::vector<std::string>& words, co
   std::vector<std::string> candidates;
   if (words.size() < 2) {
     candidates.assign(std::begin(kCommandNames), std::end(kCommandNames));
-    candidates.insert(candidates.end(), {"--help", "--version"});
+    candidates.insert(candidates.end(), {kHelpWord, "--help", "--version"});
   } else {
     candidates = Completer(words, installation).all();
   }

@@ -33,12 +33,7 @@ class Doctor {
     for (const std::filesystem::path& plugin : plugins) {
       check("plug-in", plugin.string(), [&] { return findingOfPlugin(plugin); });
     }
-    const std::filesystem::path profile = installation_.defaultProfile();
-    check("profile", profile.string(), [&] {
-      const Profile read = readProfile(profile);
-      return "entries for " + countText(read.entries.size(), "diagnostic") + " and " +
-             countText(read.experiments.size(), "experiment");
-    });
+    checkProfiles();
     checkPhones();
     check("explanations", installation_.explanations().back().string(),
           [&] { return countText(readExplanations(installation_.explanations()).size(), "explanation"); });
@@ -81,6 +76,23 @@ class Doctor {
     }
     return countText(diagnostics, "diagnostic") + ", " + countText(scan.catalogue.size() - diagnostics, "experiment") +
            (isLoadedOnlyWhenNamed(plugin) ? "; loaded only if --plugin names it" : "");
+  }
+
+  // The default profile comes first, and is missed if it is not there.
+  void checkProfiles() {
+    const std::filesystem::path byDefault = installation_.defaultProfile();
+    std::vector<std::filesystem::path> files = {byDefault};
+    for (const std::string& name : installation_.profileNames()) {
+      const std::filesystem::path file = installation_.namedProfile(name);
+      if (file != byDefault) files.push_back(file);
+    }
+    for (const std::filesystem::path& file : files) {
+      check("profile", file.string(), [&] {
+        const Profile read = readProfile(file);
+        return "entries for " + countText(read.entries.size(), "diagnostic") + " and " +
+               countText(read.experiments.size(), "experiment") + (file == byDefault ? "; the default profile" : "");
+      });
+    }
   }
 
   void checkPhones() {

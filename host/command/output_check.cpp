@@ -43,7 +43,7 @@ bool isSpecial(const fs::path& file) {
 
 std::vector<fs::path> inputsOf(const Options& options, const Installation& installation, const RunStarted& began) {
   std::vector<fs::path> inputs = options.records;
-  inputs.insert(inputs.end(), options.parameterFiles.begin(), options.parameterFiles.end());
+  for (const fs::path& name : options.parameterFiles) inputs.push_back(installation.profile(name));
   inputs.insert(inputs.end(), began.plugins.begin(), began.plugins.end());
   inputs.push_back(bindingNamed(began.phone).value_or(began.phone));
   inputs.push_back(options.profile.empty() ? installation.defaultProfile() : installation.profile(options.profile));

@@ -263,7 +263,7 @@ class PluginReview {
 
   void reviewRun(const ResolvedDiagnostic& one) {
     const std::string& name = one.described.diagnostic.name;
-    if (const std::string missing = missingParameterOf(one.described, one.parameters); !missing.empty()) {
+    if (const std::string missing = missingParameterOf(one, options_, installation_); !missing.empty()) {
       tell(Rating::kAdvice, name,
            formatMessage("it was not run: %@ 'quazor run --all' gives it an error; give its parameters defaults, and "
                          "run this command with --set",

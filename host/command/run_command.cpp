@@ -157,8 +157,9 @@ void refuseUnusedSkips(const std::vector<SkipRule>& rules, const Selection& sele
 
 // The error of a diagnostic that lacks a required parameter, or null. Throws a CommandError (kUsage) instead for one
 // that the user named: the others are not worth running without it.
-DiagnosticErrorPtr missingParameter(const ResolvedDiagnostic& one, const Options& options) {
-  const std::string problem = missingParameterOf(one.described, one.parameters);
+DiagnosticErrorPtr missingParameter(const ResolvedDiagnostic& one, const Options& options,
+                                    const Installation& installation) {
+  const std::string problem = missingParameterOf(one, options, installation);
   if (problem.empty()) return nullptr;
   const std::string& name = one.described.diagnostic.name;
   const bool isNamed = std::find(options.names.begin(), options.names.end(), name) != options.names.end();
@@ -197,7 +198,7 @@ ExitCode runCommand(const Options& given, const Installation& installation, Cons
   std::vector<Job> jobs;
   for (ResolvedDiagnostic& one : selection.diagnostics) {
     std::optional<Skip> skip = skipOf(one.described.diagnostic.name, options.choice.skips, phone.absent);
-    DiagnosticErrorPtr problem = skip ? nullptr : missingParameter(one, options);
+    DiagnosticErrorPtr problem = skip ? nullptr : missingParameter(one, options, installation);
     jobs.push_back({std::move(one), nullptr, options.seed, std::move(skip), std::move(problem)});
   }
   RunOptions runOptions;

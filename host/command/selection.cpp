@@ -51,19 +51,27 @@ void leaveOut(const std::string& pattern, bool mayBeNone, std::vector<Diagnostic
   throw CommandError(ExitCode::kUsage, "--except '" + pattern + "' fits nothing of what is selected to run");
 }
 
+// Reads the profile that --profile or --parameters names. Those in the folders of profiles serve any set of plug-ins.
+Profile chosenProfile(const std::filesystem::path& name, const Installation& installation) {
+  const std::filesystem::path file = installation.profile(name);
+  Profile profile = readProfileToCheck(file);
+  profile.mayNameOthers = file != name;
+  return profile;
+}
+
 std::vector<Profile> profilesOf(const Options& options, const Installation& installation) {
   std::vector<Profile> profiles;
   if (!options.withoutProfile && options.profile.empty()) {
     profiles.push_back(readProfileToCheck(installation.defaultProfile()));
-    profiles.back().mayNameOthers = true;  // the installed profile serves any set of plug-ins
+    profiles.back().mayNameOthers = true;
   }
   if (options.recorded) profiles.push_back(*options.recorded);
   if (!options.withoutProfile && !options.profile.empty()) {
-    const std::filesystem::path file = installation.profile(options.profile);
-    profiles.push_back(readProfileToCheck(file));
-    profiles.back().mayNameOthers = file != options.profile;  // it is an installed one
+    profiles.push_back(chosenProfile(options.profile, installation));
   }
-  for (const std::filesystem::path& file : options.parameterFiles) profiles.push_back(readProfileToCheck(file));
+  for (const std::filesystem::path& name : options.parameterFiles) {
+    profiles.push_back(chosenProfile(name, installation));
+  }
   return profiles;
 }
 
@@ -189,6 +197,15 @@ Selection select(const Options& options, const Installation& installation, Watch
   return selection;
 }
 
+std::string missingParameterOf(const ResolvedDiagnostic& one, const Options& options,
+                               const Installation& installation) {
+  std::string problem = missingParameterOf(one.described, one.parameters);
+  if (problem.empty() || options.withoutProfile || options.profile.empty()) return problem;
+  if (installation.profile(options.profile) == installation.defaultProfile()) return problem;
+  const std::string name = options.profile.string();
+  return problem + "; --profile " + name + " replaces the default profile, and --parameters " + name + " adds to it";
+}
+
 std::vector<std::string> wantedScenarios(const std::vector<std::string>& names, const Installation& installation) {
   std::vector<std::string> all = installation.scenarioNames();
   if (names.empty()) return all;
@@ -204,7 +221,7 @@ std::vector<std::string> wantedScenarios(const std::vector<std::string>& names, 
     }
     const bool found = wanted.size() > before || std::find(wanted.begin(), wanted.end(), name) != wanted.end();
     if (!found)
-      throw CommandError(ExitCode::kUsage, "no installed phone is called '" + name + "'" + didYouMean(name, all));
+      throw CommandError(ExitCode::kUsage, "no installed phone is called '" + name + "'" + didYouMeanPath(name, all));
   }
   return wanted;
 }

@@ -47,6 +47,9 @@ PluginScan scanForSelection(const Options& options, const Installation& installa
 // plug-in could not be loaded, because that plug-in may define it.
 Selection select(const Options& options, const Installation& installation, WatchedSignals* signals = nullptr);
 
+// Like missingParameterOf() of its parameters; a profile that took the place of the default one may be the reason.
+std::string missingParameterOf(const ResolvedDiagnostic& one, const Options& options, const Installation& installation);
+
 // The installed scenarios and those of the user that the names and patterns fit, each once, and files; all without
 // names. Throws a CommandError (kUsage) for a name that fits none.
 std::vector<std::string> wantedScenarios(const std::vector<std::string>& names, const Installation& installation);

@@ -49,9 +49,8 @@ class Selftest {
         status_(console.showsProgress ? &console.err : nullptr),
         signals_(signals) {
     profile_ = readProfile(installation.defaultProfile());
-    // Without an installed profile of that name, profile() returns the name itself.
-    const std::filesystem::path strict = installation.profile(kStrict);
-    if (strict != kStrict) strict_ = readProfile(strict);
+    const std::filesystem::path strict = installation.namedProfile(kStrict);
+    if (!strict.empty()) strict_ = readProfile(strict);
   }
 
   // Ends at an interrupt; the phone that was running then is left out.

@@ -1,0 +1,160 @@
+"""Profiles of one's own, and the names of profiles, phones and commands."""
+
+import json
+import unittest
+
+from command_line_fixture import WORKING, CommandLineTest, quazor
+
+LIMITS = {"schema": 1, "diagnostics": {"Fake.One": {"limits": [{"limit": "Total >= 90"}]}}}
+
+
+def values(**parameters):
+    return {"schema": 1, "diagnostics": {"Fake.One": {"experiment": parameters}, "Other.*": {"experiment": {"x": 1}}}}
+
+
+class ProfilesCase(CommandLineTest):
+    def setUp(self):
+        super().setUp()
+        self.folder = self.directory / "quazor" / "profiles"
+        self.folder.mkdir(parents=True)
+        self.environment = {"XDG_DATA_HOME": str(self.directory)}
+
+    def add(self, name, content):
+        file = self.folder / f"{name}.json"
+        file.write_text(json.dumps(content))
+        return file
+
+    def describe(self, *arguments):
+        return quazor("describe", "Fake.One", "--plugin", WORKING, *arguments, env=self.environment)
+
+    def run_one(self, *arguments, name="Fake.One"):
+        return quazor("run", name, "--plugin", WORKING, "--phone", self.phone, *arguments, env=self.environment)
+
+
+class OwnDefaultTest(ProfilesCase):
+    def test_it_takes_the_place_of_the_installed_one(self):
+        self.add("default", values(duration=7))
+        self.assertRegex(self.describe().stdout, r"duration +7  profile default\.json")
+        self.assertRegex(self.describe("--profile", "default").stdout, r"duration +7  profile default\.json")
+        self.assertRegex(self.describe("--profile", "none").stdout, r"duration +-  not set, required")
+        installed = quazor("describe", "CameraSyncDiagnostic.Back", env=self.environment).stdout
+        self.assertNotIn("profile default.json", installed)
+
+    def test_its_limits_count(self):
+        content = values(duration=1)
+        content["diagnostics"]["Fake.One"]["limits"] = [{"limit": "Nothing > 1"}]
+        self.add("default", content)
+        self.assertIn("Nothing > 1", self.run_one().stdout)
+        self.assertNotIn("Nothing > 1", self.run_one("--profile", "none", "--set", "duration=1").stdout)
+
+    def test_its_mistake_is_told(self):
+        file = self.folder / "default.json"
+        file.write_text("{")
+        self.assert_refused(self.run_one(), 66, f"{file}:1: not valid JSON")
+
+    def test_no_report_overwrites_it(self):
+        file = self.add("default", values(duration=1))
+        before = file.read_text()
+        self.assert_refused(self.run_one("--output", file), 64, "is an input of this run")
+        self.assertEqual(file.read_text(), before)
+
+    def test_doctor_shows_which_one_is_the_default(self):
+        own = self.add("mine", values(duration=1))
+        profiles = self.profiles_of_doctor()
+        self.assertEqual([name.endswith("share/quazor/profiles/default.json") for name, finding in profiles
+                          if finding.endswith("; the default profile")], [True])
+        self.assertIn((str(own), "entries for 2 diagnostics and 0 experiments"), profiles)
+        own = self.add("default", values(duration=1))
+        profiles = self.profiles_of_doctor()
+        self.assertEqual([name for name, finding in profiles if finding.endswith("; the default profile")], [str(own)])
+        self.assertEqual(len([name for name, _ in profiles if name.endswith("default.json")]), 1)
+
+    def profiles_of_doctor(self):
+        result = quazor("doctor", env={**self.environment, "XDG_STATE_HOME": str(self.directory)})
+        self.assertEqual(result.returncode, 0, result.stdout)
+        lines = result.stdout.splitlines()
+        start = "ok       profile "
+        return [(line.removeprefix(start), lines[i + 1].strip()) for i, line in enumerate(lines)
+                if line.startswith(start)]
+
+
+class AddedProfileTest(ProfilesCase):
+    def setUp(self):
+        super().setUp()
+        self.add("default", values(duration=1))
+
+    def test_a_profile_with_limits_only_replaces_the_default_one(self):
+        file = self.write("limits.json", json.dumps(LIMITS))
+        due = ("Fake.One requires the parameter experiment.duration; set it with --set experiment.duration=VALUE or in "
+               f"a profile; --profile {file} replaces the default profile, and --parameters {file} adds to it\n")
+        self.assert_refused(self.run_one("--profile", file), 64, due)
+        everything = self.run_one("--profile", file, name="--all")
+        self.assertEqual(everything.returncode, 2)
+        self.assertIn("replaces the default profile", everything.stdout)
+        self.assertNotEqual(self.run_one("--parameters", file).returncode, 64)
+
+    def test_only_another_profile_is_the_reason(self):
+        self.add("default", values())
+        for arguments in ((), ("--profile", "default"), ("--profile", "none")):
+            with self.subTest(arguments):
+                result = self.run_one(*arguments)
+                self.assert_refused(result, 64, "or in a profile\n")
+                self.assertNotIn("replaces", result.stderr)
+
+    def test_parameters_take_names_like_profile(self):
+        self.add("more", values(measured=5))
+        result = self.describe("--parameters", "more")
+        self.assertRegex(result.stdout, r"duration +1  profile default\.json")
+        self.assertRegex(result.stdout, r"measured +5  profile more\.json")
+        # As a file, it must not name what is not loaded.
+        result = self.describe("--parameters", self.folder / "more.json")
+        self.assert_refused(result, 66, "no diagnostic matches this pattern")
+        result = self.run_one("--parameters", "more", "--output", self.folder / "more.json")
+        self.assert_refused(result, 64, "is an input of this run")
+        self.assertRegex(quazor("run", "--help").stdout, r"--parameters FILE\|NAME .*values and limits")
+
+
+class SuggestedNamesTest(ProfilesCase):
+    def test_profiles(self):
+        for option in ("--profile", "--parameters"):
+            self.assert_refused(self.run_one(option, "strikt"), 66, "strikt: the file does not exist; did you mean 'strict'?")
+        self.assert_refused(self.run_one("--profile", "strict.json"), 66, "did you mean 'strict'?")
+        self.assert_refused(self.run_one("--profile", "nothing_like_it"), 66, "nothing_like_it: the file does not exist.")
+
+    def test_phones(self):
+        rows = {"camera_sync/frame_dropped": "camera_sync/frames_dropped", "frames_dropped": "camera_sync/frames_dropped",
+                "healty": "healthy", "linux:vivit": "vivid"}
+        for name, near in rows.items():
+            with self.subTest(name):
+                result = quazor("run", "Fake.One", "--plugin", WORKING, "--profile", "none", "--set", "duration=1",
+                                "--phone", name)
+                self.assert_refused(result, 66, f"{name.removeprefix('linux:')}: the file does not exist; ",
+                                    f"did you mean '{near}'")
+        self.assert_refused(quazor("phone", "list", "frames_dropped"), 64, "did you mean 'camera_sync/frames_dropped'")
+
+
+class HelpTest(CommandLineTest):
+    def test_an_unknown_option_leads_to_the_help_of_its_command(self):
+        self.assert_refused(quazor("run", "--all", "--nonsense"), 64, "--nonsense\nRun 'quazor run --help' for usage.\n")
+        self.assert_refused(quazor("verify"), 64, "Run 'quazor verify --help' for usage.\n")
+        self.assert_refused(quazor("--nonsense"), 64, "Run 'quazor --help' for usage.\n")
+
+    def test_help_is_a_word_too(self):
+        for words, options in ((("help",), ("--help",)), (("help", "run"), ("run", "--help")),
+                               (("help", "--help"), ("--help",))):
+            with self.subTest(words):
+                result = quazor(*words)
+                self.assertEqual((result.returncode, result.stderr), (0, ""))
+                self.assertEqual(result.stdout, quazor(*options).stdout)
+        self.assert_refused(quazor("help", "rnu"), 64, "unknown command 'rnu'; did you mean 'run'?")
+        self.assert_refused(quazor("help", "run", "verify"), 64, "takes the name of one command")
+
+    def test_the_completion_offers_it(self):
+        self.assertEqual(quazor("__complete", "hel").stdout.split(), ["help"])
+        self.assertEqual(quazor("__complete", "help", "ver").stdout.split(), ["verify"])
+        self.assertEqual(quazor("__complete", "run", "--profile", "").stdout.split(), ["default", "strict", "none"])
+        self.assertEqual(quazor("__complete", "run", "--parameters", "s").stdout.split(), ["strict"])
+
+
+if __name__ == "__main__":
+    unittest.main()
