@@ -187,6 +187,10 @@ void printSelftest(std::ostream& out, const SelftestOutcome& outcome) {
   } else {
     out << formatMessage("NOT as the phone expects: %@ of %@ runs\n", differing, rows.size());
   }
+  if (!outcome.refused.empty()) {
+    const std::size_t refused = outcome.refused.size();
+    out << formatMessage("Refused: %@ of %@ phones\n", refused, outcome.wanted + refused);
+  }
   if (!outcome.isComplete()) {
     out << formatMessage("Interrupted: %@ of %@ phones were run.\n", outcome.phones.size(), outcome.wanted);
   }
@@ -210,6 +214,8 @@ Json selftestDocument(const SelftestOutcome& outcome) {
                     {"difference", row.difference.empty() ? Json() : Json(row.difference)},
                     {"faultsFired", row.faultsFired}});
   }
+  Json refused = Json::array();
+  for (const RefusedPhone& one : outcome.refused) refused.push_back({{"phone", one.name}, {"reason", one.reason}});
   return {{"schema", 1},
           {"seeds", outcome.seeds},
           {"allAsExpected", allPassed(verdicts)},
@@ -217,6 +223,7 @@ Json selftestDocument(const SelftestOutcome& outcome) {
           {"phonesWanted", outcome.wanted},
           {"totals", totalsJson(totalsOf(outcome.phones))},
           {"phones", detectionsJson(outcome.phones)},
+          {"refused", std::move(refused)},
           {"rows", std::move(json)}};
 }
 

@@ -45,11 +45,18 @@ std::vector<SelftestVerdict> verdictsOf(const std::vector<SelftestRow>& rows);
 // True if every row is kPassed or kDetected.
 bool allPassed(const std::vector<SelftestVerdict>& verdicts);
 
+// A phone that was not run, because its file has a mistake or expects something of a diagnostic that is not loaded.
+struct RefusedPhone {
+  std::string name;
+  std::string reason;
+};
+
 struct SelftestOutcome {
   std::vector<SelftestRow> rows;
   std::vector<PhoneDetection> phones;
   std::uint64_t seeds = 0;
   std::size_t wanted = 0;  // the number of phones to run, which is greater than that of `phones` after an interrupt
+  std::vector<RefusedPhone> refused;  // not counted in `wanted`
 
   bool isComplete() const { return phones.size() == wanted; }
 };

@@ -1,5 +1,6 @@
 #include "host/command/commands.h"
 
+#include "base/text/input_error.h"
 #include "contract/message_format.h"
 #include "host/command/selection.h"
 #include "host/command/selftest.h"
@@ -13,8 +14,11 @@
 #include <deque>
 #include <iterator>
 #include <optional>
+#include <ostream>
 #include <sstream>
+#include <string>
 #include <utility>
+#include <vector>
 
 namespace quazor {
 
@@ -46,6 +50,7 @@ class Selftest {
         scan_(scanOf(
             options_, installation, [](const std::vector<Diagnostic>& all) { return all; }, signals)),
         isolation_(withoutFailed(isolationOf(options_, installation), scan_.failed)),
+        err_(console.err),
         status_(console.showsProgress ? &console.err : nullptr),
         signals_(signals) {
     profile_ = readProfile(installation.defaultProfile());
@@ -53,25 +58,28 @@ class Selftest {
     if (!strict.empty()) strict_ = readProfile(strict);
   }
 
-  // Ends at an interrupt; the phone that was running then is left out.
+  // Ends at an interrupt; the phone that was running then is left out. A phone that is refused does not keep the others
+  // from being run.
   SelftestOutcome perform() {
     SelftestOutcome outcome;
-    const std::vector<std::string> names = wantedScenarios(options_.names, installation_);
     outcome.seeds = options_.seeds;
-    for (const std::string& name : names) {
-      const ScenarioSummary summary = summaryOfScenario(installation_.scenario(name), installation_.scenarioSource());
-      if (summary.expected.empty()) continue;
-      ++outcome.wanted;
-    }
-    for (const std::string& name : names) {
-      showProgress(outcome, name);
-      if (!performPhone(name, outcome)) break;
+    const std::vector<WantedPhone> wanted = readPhones(outcome.refused);
+    outcome.wanted = wanted.size();
+    for (const WantedPhone& phone : wanted) {
+      showProgress(outcome, phone.name);
+      if (!performPhone(phone, outcome)) break;
     }
     status_.erase();
     return outcome;
   }
 
  private:
+  struct WantedPhone {
+    std::string name;
+    std::filesystem::path file;
+    ScenarioSummary summary;
+  };
+
   struct HealthyRun {
     std::string name;
     DiagnosticRecord record;
@@ -82,6 +90,37 @@ class Selftest {
     return options;
   }
 
+  // The phones with an expected outcome. Those that cannot be run are told and added to `refused`.
+  std::vector<WantedPhone> readPhones(std::vector<RefusedPhone>& refused) {
+    std::vector<WantedPhone> phones;
+    for (const std::string& name : wantedScenarios(options_.names, installation_)) {
+      const std::filesystem::path file = installation_.scenario(name);
+      try {
+        ScenarioSummary summary = summaryOfScenario(file, installation_.scenarioSource());
+        leaveOutInherited(summary.expected, file);
+        if (!summary.expected.empty()) phones.push_back({name, file, std::move(summary)});
+      } catch (const InputError& problem) {
+        err_ << "quazor: REFUSED phone " << printable(name) << ": " << printable(problem.what()) << '\n';
+        refused.push_back({name, problem.what()});
+      }
+    }
+    return phones;
+  }
+
+  // Whoever bases a phone on another one need not load the diagnostics of that one: removes what is expected of
+  // diagnostics that are not loaded. Throws InputError if the file itself expects it, or if a plug-in that failed to
+  // load may have the diagnostic.
+  void leaveOutInherited(std::vector<ExpectedOutcome>& expected, const std::filesystem::path& file) const {
+    std::erase_if(expected, [&](const ExpectedOutcome& one) {
+      if (findLoaded(one) != nullptr) return false;
+      const std::string problem = "no loaded plug-in has " + one.name;
+      failIfNamedIn(file, one, problem + "; load it with --plugin, or remove this entry.");
+      if (scan_.failed.empty()) return true;
+      throw InputError(file.string() + ": " + problem + ", and " + scan_.failed.front().file.string() +
+                       " failed to load.");
+    });
+  }
+
   void showProgress(const SelftestOutcome& outcome, const std::string& name) {
     status_.show(formatMessage("Selftest: %@ of %@ phones done, now %@", outcome.phones.size(), outcome.wanted,
                                printable(name)));
@@ -90,10 +129,8 @@ class Selftest {
   bool isInterrupted() const { return signals_ != nullptr && signals_->requestsToEnd() > 0; }
 
   // Adds the rows of the phone and its detection. Returns false if it was interrupted; then it adds nothing.
-  bool performPhone(const std::string& name, SelftestOutcome& outcome) {
-    const std::filesystem::path file = installation_.scenario(name);
-    const ScenarioSummary summary = summaryOfScenario(file, installation_.scenarioSource());
-    if (summary.expected.empty()) return true;
+  bool performPhone(const WantedPhone& wanted, SelftestOutcome& outcome) {
+    const auto& [name, file, summary] = wanted;
     PhoneDetection phone{name, summary.title, file == installation_.defaultScenario(), false, {}, {}, {}};
     std::vector<SelftestRow> rows;
     for (const ExpectedOutcome& expected : summary.expected) {
@@ -181,13 +218,17 @@ class Selftest {
     for (std::size_t i = 0; i < record.faults.size(); ++i) row.faultsFired[i] += record.faults[i].fired;
   }
 
-  const DescribedDiagnostic& find(const ExpectedOutcome& expected) const {
+  // Null if no loaded plug-in has it.
+  const DescribedDiagnostic* findLoaded(const ExpectedOutcome& expected) const {
     for (const DescribedDiagnostic& one : scan_.catalogue) {
       const Diagnostic& diagnostic = one.diagnostic;
-      if (diagnostic.name == expected.name && diagnostic.experimentOnly == expected.experimentOnly) return one;
+      if (diagnostic.name == expected.name && diagnostic.experimentOnly == expected.experimentOnly) return &one;
     }
-    throw CommandError(ExitCode::kCannotRead, "a phone expects " + expected.name + ", but no loaded plug-in has it");
+    return nullptr;
   }
+
+  // readPhones() kept only what is loaded.
+  const DescribedDiagnostic& find(const ExpectedOutcome& expected) const { return *findLoaded(expected); }
 
   static ResolvedParameters parametersOf(const DescribedDiagnostic& described, const ExpectedOutcome& expected,
                                          const Profile& profile) {
@@ -215,6 +256,7 @@ class Selftest {
   const Installation& installation_;
   const PluginScan scan_;
   const IsolationOptions isolation_;
+  std::ostream& err_;
   StatusLine status_;
   Profile profile_;
   std::optional<Profile> strict_;
@@ -227,9 +269,12 @@ class Selftest {
 ExitCode selftestCommand(const Options& options, const Installation& installation, Console& console,
                          WatchedSignals* signals) {
   const SelftestOutcome outcome = Selftest(options, installation, console, signals).perform();
+  const std::size_t refused = outcome.refused.size();
+  const std::string refusal = formatMessage("%@ of %@ phones were refused", refused, outcome.wanted + refused);
   if (outcome.rows.empty()) {
     if (!outcome.isComplete()) throw CommandError(ExitCode::kInterrupted, "interrupted before any phone was tested");
-    throw CommandError(ExitCode::kCannotRead, "nothing was tested: no phone has an expected outcome");
+    const std::string why = refused == 0 ? "no phone has an expected outcome" : refusal;
+    throw CommandError(ExitCode::kCannotRead, "nothing was tested: " + why);
   }
   std::ostringstream text = textFor(options.report, console);
   if (options.report.format == Format::kJson) {
@@ -242,6 +287,7 @@ ExitCode selftestCommand(const Options& options, const Installation& installatio
     throw CommandError(ExitCode::kInterrupted,
                        formatMessage("interrupted: %@ of %@ phones were run", outcome.phones.size(), outcome.wanted));
   }
+  if (refused > 0) throw CommandError(ExitCode::kCannotRead, refusal);
   return allPassed(verdictsOf(outcome.rows)) ? ExitCode::kAllPassed : ExitCode::kFailed;
 }
 

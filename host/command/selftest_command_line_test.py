@@ -10,11 +10,13 @@ import subprocess
 import time
 import unittest
 
-from command_line_fixture import PROGRAM, CommandLineTest, quazor
+from command_line_fixture import PLUGINS, PROGRAM, CommandLineTest, quazor
 
 DROPPED = "camera_sync/frames_dropped"
 STOP_REFUSED = "camera_sync/stop_refused"
 REFUSED = "camera_sync/start_refused_on_first"
+EXAMPLE = PLUGINS / "event_count.so"
+BACK = "CameraSyncDiagnostic.Back"
 
 
 class SelftestTest(CommandLineTest):
@@ -40,7 +42,6 @@ class SelftestTest(CommandLineTest):
         self.assertTrue(any("BackTele.Total" in one for one in phone["reasons"]), phone)
         self.assertFalse(document["interrupted"])
 
-
     def test_the_limit_on_log_lines_holds_in_this_process_too(self):
         def reasons(*arguments):
             result = quazor("selftest", STOP_REFUSED, "--seeds", "1", "--format", "json", *arguments)
@@ -53,6 +54,64 @@ class SelftestTest(CommandLineTest):
         limited = [everything[0], "1 more log line was left out (--log-limit)"]
         self.assertEqual(reasons("--log-limit", "1"), limited)
         self.assertEqual(reasons("--log-limit", "1", "--in-process"), limited)
+
+
+class PhonesOfAUserTest(CommandLineTest):
+    def phone_file(self, name, **entries):
+        return self.write(name, json.dumps({"base": "healthy", "title": name, **entries}, indent=1))
+
+    def on_healthy(self, name, **expected):
+        events = {"Backlight": {"Backlight Events": {"Level changes": 31}}}
+        return self.phone_file(name, reports=events, expect={"EventCountDiagnostic": {"verdict": "pass"}, **expected})
+
+    def selftest(self, *phones, **options):
+        return quazor("selftest", *phones, "--plugin", EXAMPLE, "--seeds", "1", "--format", "json", **options)
+
+    def test_an_inherited_expectation_of_a_diagnostic_that_is_not_loaded_is_left_out(self):
+        phone = self.on_healthy("mine.json")
+        above = self.phone_file("above.json", base="mine.json")
+        for file in (phone, above):
+            with self.subTest(file):
+                result = self.selftest(file)
+                self.assertEqual(result.returncode, 0, result.stderr)
+                self.assertEqual([row["name"] for row in json.loads(result.stdout)["rows"]], ["EventCountDiagnostic"])
+        nothing = self.phone_file("nothing.json")
+        self.assert_refused(self.selftest(nothing), 66, "nothing was tested")
+
+    def test_an_expectation_of_the_file_itself_needs_its_diagnostic(self):
+        phone = self.on_healthy("named.json", **{BACK: {"verdict": "pass"}})
+        line = phone.read_text()[:phone.read_text().index(BACK)].count("\n") + 1
+        self.assert_refused(self.selftest(phone), 66, f"{phone}:{line}: expect.{BACK}: ", f"no loaded plug-in has {BACK}",
+                            "--plugin")
+        entry = {"experiment": "NimbeImageExperiment", "verdict": "pass"}
+        phone = self.on_healthy("experiment.json", **{"One image": entry})
+        self.assert_refused(self.selftest(phone), 66, f"{phone}:", "expect.One image: ",
+                            "no loaded plug-in has NimbeImageExperiment")
+
+    def test_a_phone_that_is_refused_does_not_keep_the_others_from_being_tested(self):
+        data = self.directory / "data"
+        folder = data / "quazor/scenarios/mine"
+        folder.mkdir(parents=True)
+        env = {"XDG_DATA_HOME": str(data)}
+        self.on_healthy("good.json").rename(folder / "good.json")
+        (folder / "broken.json").write_text('{\n  "title": "Broken",\n  "cameras": 7\n}\n')
+        named = self.on_healthy("named.json", **{BACK: {"verdict": "pass"}})
+        result = self.selftest("mine/*", named, env=env)
+        self.assertEqual(result.returncode, 66, result.stderr)
+        self.assertIn("quazor: REFUSED phone mine/broken: ", result.stderr)
+        self.assertIn(f"{folder}/broken.json:3: cameras: ", result.stderr)
+        self.assertIn(f"quazor: REFUSED phone {named}: ", result.stderr)
+        self.assertIn("2 of 3 phones were refused", result.stderr.splitlines()[-1])
+        document = json.loads(result.stdout)
+        self.assertEqual([row["phone"] for row in document["rows"]], ["mine/good"])
+        self.assertEqual([one["phone"] for one in document["refused"]], ["mine/broken", str(named)])
+        self.assertIn("broken.json:3: cameras: ", document["refused"][0]["reason"])
+        self.assertFalse(document["interrupted"])
+        text = quazor("selftest", "mine/*", "--plugin", EXAMPLE, "--seeds", "1", env=env)
+        self.assertEqual(text.returncode, 66)
+        self.assertIn("\nRefused: 1 of 2 phones\n", text.stdout)
+        (folder / "broken.json").unlink()
+        self.assertEqual(self.selftest("mine/*", env=env).returncode, 0)
 
 
 class InterruptedSelftestTest(CommandLineTest):

@@ -14,7 +14,7 @@
 namespace quazor {
 namespace {
 
-ExpectedOutcome passes() { return {"Name", false, {}, "pass", std::nullopt, std::nullopt, {}, std::nullopt}; }
+ExpectedOutcome passes() { return {"Name", false, {}, "pass", std::nullopt, std::nullopt, {}, std::nullopt, "Name"}; }
 
 ExpectedOutcome errs() {
   ExpectedOutcome outcome = passes();
@@ -149,6 +149,18 @@ TEST(Selftest, SaysHowFarItCame) {
                                            "Interrupted: 1 of 7 phones were run.\n"));
   EXPECT_EQ(selftestDocument(outcome)["interrupted"], true);
   EXPECT_EQ(selftestDocument(outcome)["phonesWanted"], 7);
+}
+
+TEST(Selftest, SaysWhatWasRefused) {
+  SelftestOutcome outcome = outcomeOf({row("faulty", errs(), 3, 3, {1})});
+  outcome.wanted = outcome.phones.size();
+  EXPECT_EQ(selftestDocument(outcome)["refused"], nlohmann::ordered_json::array());
+  outcome.refused = {{"broken", "broken.json:3: cameras: must be an object, not 7."}};
+  std::ostringstream out;
+  printSelftest(out, outcome);
+  EXPECT_THAT(out.str(), testing::EndsWith("\nRefused: 1 of 2 phones\n"));
+  const nlohmann::ordered_json due = {{"phone", "broken"}, {"reason", outcome.refused[0].reason}};
+  EXPECT_EQ(selftestDocument(outcome)["refused"], nlohmann::ordered_json::array({due}));
 }
 
 TEST(Selftest, IsADocumentToo) {

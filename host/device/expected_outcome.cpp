@@ -42,6 +42,7 @@ ExpectedOutcome readOutcome(const std::string& name, const JsonCursor& cursor) {
   cursor.allowKeys({"experiment", "parameters", "verdict", "error", "underlying", "failedResults", "images"});
   ExpectedOutcome outcome;
   outcome.name = name;
+  outcome.key = name;
   outcome.verdict = cursor.at("verdict").oneOf(kVerdicts, "a verdict");
   outcome.error = readExpectedError(cursor, "error");
   outcome.underlying = readExpectedError(cursor, "underlying");
@@ -68,6 +69,13 @@ std::vector<ExpectedOutcome> readExpectedOutcomes(const JsonCursor& scenario) {
   if (!expect) return outcomes;
   for (const auto& [name, outcome] : expect->entries()) outcomes.push_back(readOutcome(name, outcome));
   return outcomes;
+}
+
+void failIfNamedIn(const std::filesystem::path& file, const ExpectedOutcome& expected, const std::string& sentence) {
+  const JsonDocument document = JsonDocument::read(file);  // without its base
+  const std::optional<JsonCursor> expect = JsonCursor(document).find("expect");
+  if (!expect) return;
+  if (const std::optional<JsonCursor> entry = expect->find(expected.key)) entry->fail(sentence);
 }
 
 }  // namespace quazor

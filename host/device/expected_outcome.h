@@ -4,6 +4,7 @@
 #include "contract/ordered_map.h"
 
 #include <cstdint>
+#include <filesystem>
 #include <optional>
 #include <string>
 #include <vector>
@@ -28,10 +29,15 @@ struct ExpectedOutcome {
   std::optional<ExpectedError> underlying;  // nothing: not compared
   std::vector<std::string> failedResults;
   std::optional<std::uint64_t> images;  // the number of images in the auxiliary data; nothing: not compared
+  std::string key;                      // of its entry in "expect"; not `name` if it is a run of an experiment
 };
 
 // The expected outcomes of a scenario, in order; empty without the key "expect". Throws InputError, like JsonCursor, if
 // an outcome is malformed or contradictory. Thread: any.
 std::vector<ExpectedOutcome> readExpectedOutcomes(const JsonCursor& scenario);
+
+// Throws InputError, "FILE:LINE: expect.KEY: SENTENCE", if the file itself has the entry of this outcome. Returns if
+// the scenario only inherited it from its base. Thread: any.
+void failIfNamedIn(const std::filesystem::path& file, const ExpectedOutcome& expected, const std::string& sentence);
 
 }  // namespace quazor

@@ -2,6 +2,7 @@
 
 #include "base/json/json_cursor.h"
 #include "base/text/input_error.h"
+#include "host/testing/test_directory.h"
 #include "tests/support/thrown_text.h"
 
 #include <gmock/gmock.h>
@@ -48,6 +49,19 @@ TEST(ExpectedOutcomes, AreReadInTheirOrder) {
   EXPECT_TRUE(alone.experimentOnly);
   EXPECT_EQ(alone.parameters, (OrderedMap<double>{{"images", 5.0}, {"timeout", -0.5}}));
   EXPECT_EQ(alone.images, 6U);
+}
+
+TEST(ExpectedOutcomes, AreToldWithTheLineIfTheFileItselfNamesThem) {
+  const TestDirectory directory;
+  const auto file =
+      directory.write("p.json", "{\"base\": \"b.json\", \"expect\": {\n\"A.B\": {\"verdict\": \"pass\"}}}");
+  ExpectedOutcome outcome = outcomesIn(R"({"A.B": {"experiment": "X", "verdict": "pass"}})")[0];
+  EXPECT_EQ(outcome.key, "A.B");
+  EXPECT_EQ(thrownText<InputError>([&] { failIfNamedIn(file, outcome, "it is not loaded."); }),
+            file.string() + ":2: expect.A.B: it is not loaded.");
+  outcome.key = "A";
+  EXPECT_NO_THROW(failIfNamedIn(file, outcome, "it is not loaded."));
+  EXPECT_NO_THROW(failIfNamedIn(directory.write("q.json", R"({"base": "b.json"})"), outcome, "it is not loaded."));
 }
 
 TEST(ExpectedOutcomes, LookAtNoMoreThanTheySay) {
