@@ -1,6 +1,5 @@
 """The heartbeat of a run: a line on standard error without a terminal, and an event in the record."""
 
-import fcntl
 import os
 import re
 import signal
@@ -8,7 +7,7 @@ import subprocess
 import threading
 import unittest
 
-from command_line_fixture import PROGRAM, RecordTest, events_in, quazor
+from command_line_fixture import PROGRAM, RecordTest, events_in, full_pipe, quazor
 from terminal_fixture import on_terminal
 
 SECONDS = 3
@@ -78,15 +77,7 @@ class HeartbeatTest(RecordTest):
         self.assertEqual(quazor("list", "--heartbeat", "2").returncode, 64)
 
     def test_a_standard_error_that_nobody_reads_does_not_stop_the_run(self):
-        reader, writer = os.pipe()
-        flags = fcntl.fcntl(writer, fcntl.F_GETFL)
-        fcntl.fcntl(writer, fcntl.F_SETFL, flags | os.O_NONBLOCK)
-        try:
-            while True:
-                os.write(writer, b"x" * 4096)
-        except BlockingIOError:
-            pass
-        fcntl.fcntl(writer, fcntl.F_SETFL, flags)
+        reader, writer = full_pipe()
         process = subprocess.Popen([PROGRAM, *REALTIME, "--heartbeat", "1", "--record", self.record],
                                    stdout=subprocess.PIPE, stderr=writer)
         os.close(writer)
