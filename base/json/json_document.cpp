@@ -182,26 +182,6 @@ Json parsed(std::string_view text, const std::string& name) {
   }
 }
 
-std::string textOf(const std::filesystem::path& file) {
-  const std::string name = file.string();
-  std::error_code failure;
-  const std::filesystem::file_status status = std::filesystem::status(file, failure);
-  if (status.type() == std::filesystem::file_type::not_found) throw InputError(name + ": the file does not exist.");
-  if (std::filesystem::is_directory(status)) throw InputError(name + ": this is a directory, not a file.");
-  std::ifstream stream(file, std::ios::binary);
-  if (!stream) throw InputError(name + ": the file cannot be opened; check its permissions.");
-  std::string text;
-  std::array<char, 65536> piece;  // read() reports a failure where stream iterators throw
-  while (stream.read(piece.data(), piece.size()) || stream.gcount() > 0) {
-    text.append(piece.data(), static_cast<std::size_t>(stream.gcount()));
-    if (text.size() > kMaxDocument) {
-      throw InputError(name + ": the file is larger than " + std::to_string(kMaxDocument >> 20U) + " MiB.");
-    }
-  }
-  if (stream.bad()) throw InputError(name + ": the file cannot be read.");
-  return text;
-}
-
 }  // namespace
 
 std::string jsonPath(const std::string& path, std::string_view key) {
@@ -221,6 +201,26 @@ std::optional<std::size_t> lineOfPath(std::string_view text, const std::string& 
 
 JsonDocument::JsonDocument(std::string text, std::string name)
     : text_(std::move(text)), name_(std::move(name)), value_(parsed(text_, name_)) {}
+
+std::string JsonDocument::textOf(const std::filesystem::path& file) {
+  const std::string name = file.string();
+  std::error_code failure;
+  const std::filesystem::file_status status = std::filesystem::status(file, failure);
+  if (status.type() == std::filesystem::file_type::not_found) throw InputError(name + ": the file does not exist.");
+  if (std::filesystem::is_directory(status)) throw InputError(name + ": this is a directory, not a file.");
+  std::ifstream stream(file, std::ios::binary);
+  if (!stream) throw InputError(name + ": the file cannot be opened; check its permissions.");
+  std::string text;
+  std::array<char, 65536> piece;  // read() reports a failure where stream iterators throw
+  while (stream.read(piece.data(), piece.size()) || stream.gcount() > 0) {
+    text.append(piece.data(), static_cast<std::size_t>(stream.gcount()));
+    if (text.size() > kMaxDocument) {
+      throw InputError(name + ": the file is larger than " + std::to_string(kMaxDocument >> 20U) + " MiB.");
+    }
+  }
+  if (stream.bad()) throw InputError(name + ": the file cannot be read.");
+  return text;
+}
 
 JsonDocument JsonDocument::read(const std::filesystem::path& file) { return {textOf(file), file.string()}; }
 

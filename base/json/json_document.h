@@ -77,6 +77,9 @@ class JsonDocument {
   // Reads a file of at most kMaxDocument bytes. Throws InputError, also if the file cannot be read.
   static JsonDocument read(const std::filesystem::path& file);
 
+  // The text of such a file, for a document that is parsed later.
+  static std::string textOf(const std::filesystem::path& file);
+
   const nlohmann::ordered_json& value() const { return value_; }
   // Replaces the value, for example with the result of a merge. The text remains: errors contain a line if their place
   // exists in the text.

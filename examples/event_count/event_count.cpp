@@ -1,6 +1,7 @@
 // A plug-in with one diagnostic: counts the events that the display's driver reports, and limits their number.
 #include "contract/diagnostic_contract.h"
 #include "contract/lab.h"
+#include "contract/parameter_range.h"
 #include "platform/platform.h"
 
 #include <memory>
@@ -61,13 +62,24 @@ class EventCountExperiment final : public QZExperiment {
 };
 
 // Turns the measurement into a result with a limit, which quazor judges.
-class EventCountAnalysis final : public QZAnalysis, public QZAnalysisSetup {
+class EventCountAnalysis final : public QZAnalysis, public QZAnalysisSetup, public QZParameterRanges {
  public:
   QZDescription analysisDescription() const override {
     QZDescription description("Ensure the brightness has not changed too often.");
-    description.addParameter(QZNumberParameter("The largest number of changes that passes; default 100.", false),
+    description.addParameter(QZNumberParameter("The largest number of changes that passes.", false),
                              "maximum");
     return description;
+  }
+
+  // What `quazor describe` shows, and what `quazor run` refuses otherwise.
+  OrderedMap<QZParameterRange> parameterRanges() const override {
+    QZParameterRange maximum;
+    maximum.setMinimum(0);
+    maximum.setUnit("events");
+    maximum.setDefault(kUsualMaximum);
+    OrderedMap<QZParameterRange> ranges;
+    ranges.set("maximum", maximum);
+    return ranges;
   }
 
   bool setupWithParameters(const Dictionary& parameters, QZDiagnosticHost*, DiagnosticErrorPtr* error) override {

@@ -1,6 +1,7 @@
 // An example plug-in: measures how late the platform's clock wakes a sleeping thread.
 #include "contract/diagnostic_contract.h"
 #include "contract/lab.h"
+#include "contract/parameter_range.h"
 #include "platform/platform.h"
 
 #include <chrono>
@@ -22,7 +23,7 @@ constexpr int kClockStoodStill = 1;  // of the domain above
 const QZUnit& milliseconds() { return QZUnit::unitWithSymbol("ms"); }
 
 // Sleeps once and measures how much longer that took than requested.
-class SleepAccuracyExperiment final : public QZExperiment {
+class SleepAccuracyExperiment final : public QZExperiment, public QZParameterRanges {
  public:
   explicit SleepAccuracyExperiment(const Platform& platform = installedPlatform()) : clock_(platform.clock) {}
 
@@ -30,6 +31,15 @@ class SleepAccuracyExperiment final : public QZExperiment {
     QZDescription description("Sleep once and measure how late the thread wakes.");
     description.addParameter(QZNumberParameter("How long to sleep, in seconds.", true), "duration");
     return description;
+  }
+
+  OrderedMap<QZParameterRange> parameterRanges() const override {
+    QZParameterRange duration;
+    duration.setMinimum(0);
+    duration.setUnit("s");
+    OrderedMap<QZParameterRange> ranges;
+    ranges.set("duration", duration);
+    return ranges;
   }
 
   bool setupWithParameters(const Dictionary& parameters, QZDiagnosticHost*, DiagnosticErrorPtr* error) override {

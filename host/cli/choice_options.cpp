@@ -67,6 +67,14 @@ void addChoiceOptions(CLI::App& command, ChoiceTexts& texts, const std::string& 
       ->type_name("N");
 }
 
+void addLogLimit(CLI::App& command, std::string& text) {
+  command
+      .add_option("--log-limit", text,
+                  "Keep at most this many log lines of each diagnostic, and this much of their text; the number of "
+                  "lines left out is logged at its end. Default 1000000,64")
+      ->type_name("LINES[,MEBIBYTES]|none");
+}
+
 Choice choiceOf(const ChoiceTexts& texts) {
   Choice choice;
   choice.except = texts.except;

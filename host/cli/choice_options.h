@@ -43,6 +43,9 @@ struct ChoiceTexts {
 // Declares the options of a command that runs diagnostics or experiments.
 void addChoiceOptions(CLI::App& command, ChoiceTexts& texts, const std::string& what);
 
+// Declares --log-limit. logLimitOf() reads its text.
+void addLogLimit(CLI::App& command, std::string& text);
+
 // Throws a CommandError (kUsage) that begins with the option.
 Choice choiceOf(const ChoiceTexts& texts);
 

@@ -191,11 +191,7 @@ void addLogOptions(CLI::App& command, RawOptions& raw) {
                   "reports. Without this option, errors are printed and reports include default")
       ->type_name("LEVEL")
       ->check(CLI::IsMember({"error", "default", "debug"}));
-  command
-      .add_option("--log-limit", raw.logLimit,
-                  "Keep at most this many log lines of each diagnostic, and this much of their text; the number of "
-                  "lines left out is logged at its end. Default 1000000,64")
-      ->type_name("LINES[,MEBIBYTES]|none");
+  addLogLimit(command, raw.logLimit);
   command.add_flag("--system-log", raw.systemLog,
                    "Also send log lines to the systemd journal, or to syslog if there is no journal");
 }
@@ -404,6 +400,7 @@ void declareOtherCommands(CLI::App& app, RawOptions& raw) {
   addReportOptions(selftest, raw, {"text", "json"});
   addProcessOptions(selftest, raw);
   addGrace(selftest, raw);
+  addLogLimit(selftest, raw.logLimit);
   CLI::App& phone =
       *app.add_subcommand("phone", "List the simulated phones, or find this machine's devices for a binding");
   phone.add_option("WHAT", raw.what, "list: the simulated phones that --phone accepts; probe: this machine's devices")

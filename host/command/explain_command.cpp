@@ -2,6 +2,7 @@
 
 #include "contract/message_format.h"
 #include "host/command/explanations.h"
+#include "host/plugin/parameter_range.h"
 #include "host/record/value_json.h"
 #include "host/text/table.h"
 
@@ -9,6 +10,7 @@
 
 #include <algorithm>
 #include <cstddef>
+#include <optional>
 #include <string_view>
 
 namespace quazor {
@@ -47,6 +49,18 @@ void printMessages(std::ostream& out, const Explanation& one) {
   }
 }
 
+void printParameters(std::ostream& out, const Explanation& one) {
+  if (one.parameters.empty()) return;
+  out << "\n  Parameters\n";
+  for (const ExplainedParameter& parameter : one.parameters) {
+    const std::optional<double>& usual = parameter.range.defaultValue();
+    printWrapped(out,
+                 formatMessage("%@: %@%@", parameter.name, rangeText(parameter.range),
+                               usual ? formatMessage(", default %@", *usual) : std::string()),
+                 "    ", "      ");
+  }
+}
+
 bool canEndIn(const std::vector<std::string>& names, const Explanation& error) {
   return std::ranges::any_of(error.messages, [&](const ExplainedMessage& message) {
     return std::ranges::find_first_of(message.from, names) != message.from.end();
@@ -75,6 +89,7 @@ void printExplanation(std::ostream& out, const Explanation& one, const std::vect
     printWrapped(out, joined(one.from), "    ", "    ");
   }
   printMessages(out, one);
+  printParameters(out, one);
   if (!one.failing.empty()) {
     out << "\n  When it fails\n";
     printWrapped(out, one.failing, "    ", "    ");
@@ -114,6 +129,11 @@ Json jsonOf(const Explanation& one) {
     object["kind"] = one.kind;
     object["from"] = one.from;
     object["failing"] = one.failing;
+    if (!one.parameters.empty()) {
+      Json& parameters = object["parameters"] = Json::object();
+      for (const ExplainedParameter& parameter : one.parameters)
+        parameters[parameter.name] = rangeJson(parameter.range);
+    }
   }
   object["title"] = one.title;
   object["meaning"] = one.meaning;

@@ -6,6 +6,7 @@
 #include "contract/message_format.h"
 #include "host/error/exit_code.h"
 #include "host/plugin/diagnostic_registry.h"
+#include "host/plugin/parameter_range.h"
 
 #include <algorithm>
 #include <array>
@@ -83,8 +84,17 @@ Explanation errorOf(const JsonCursor& object, const std::string& domain) {
   return explanation;
 }
 
+std::vector<ExplainedParameter> parametersOf(const JsonCursor& object, const std::string& kind) {
+  std::vector<ExplainedParameter> parameters;
+  const std::optional<JsonCursor> entries = object.find("parameters");
+  if (!entries) return parameters;
+  if (kind != "experiment" && kind != "analysis") entries->fail("only an experiment or analysis can have this key.");
+  for (const auto& [name, range] : entries->entries()) parameters.push_back({name, rangeFrom(range), range.path()});
+  return parameters;
+}
+
 Explanation namedOf(const JsonCursor& object) {
-  object.allowKeys({"names", "kind", "from", "title", "meaning", "failing", "causes", "next"});
+  object.allowKeys({"names", "kind", "from", "title", "meaning", "failing", "causes", "next", "parameters"});
   Explanation explanation = explanationOf(object);
   explanation.names = linesOf(object.at("names"));
   explanation.kind = object.at("kind").oneOf(kKinds, "a kind");
@@ -94,6 +104,7 @@ Explanation namedOf(const JsonCursor& object) {
     from->fail("only a result can have this key.");
   }
   explanation.failing = optionalLine(object, "failing");
+  explanation.parameters = parametersOf(object, explanation.kind);
   return explanation;
 }
 
@@ -134,6 +145,55 @@ std::vector<std::filesystem::path> filesIn(const std::vector<std::filesystem::pa
   return sorted;
 }
 
+bool holds(const std::vector<std::string>& texts, const std::string& text) {
+  return std::ranges::find(texts, text) != texts.end();
+}
+
+// The explanations of those files whose text `isWanted`.
+std::vector<Explanation> explanationsIn(const std::vector<std::filesystem::path>& files,
+                                        const std::function<bool(const std::string& text)>& isWanted) {
+  std::vector<Explanation> all;
+  std::map<std::string, std::string> seen;  // from each explained error or name to its file
+  for (const std::filesystem::path& file : files) {
+    const std::string text = JsonDocument::textOf(file);
+    if (!isWanted(text)) continue;
+    for (Explanation& one : parseExplanations(file.string(), text)) {
+      for (const std::string& key : keysOf(one)) {
+        const auto [earlier, isNew] = seen.emplace(key, file.string());
+        if (!isNew) refuse(file.string(), "'" + key + "' is already explained in '" + earlier->second + "'.");
+      }
+      all.push_back(std::move(one));
+    }
+  }
+  return all;
+}
+
+// False if the document cannot have the key "parameters", whichever way it is written.
+bool mayHaveParameters(const std::string& text) {
+  return text.find("\"parameters\"") != std::string::npos || text.find("\\u") != std::string::npos;
+}
+
+// Adds the explained ranges of one part of the diagnostic, if it is the explained one.
+void addRanges(const Explanation& explanation, Part part, DescribedDiagnostic& diagnostic) {
+  const Diagnostic& names = diagnostic.diagnostic;
+  const bool isExperiment = part == Part::kExperiment;
+  if (explanation.kind != nameOf(part) || (!isExperiment && names.experimentOnly)) return;
+  const std::string& name = isExperiment ? names.experimentName : names.analysisName;
+  if (!holds(explanation.names, name)) return;
+  for (const ExplainedParameter& one : explanation.parameters) {
+    const QZNumberParameter* const declared = diagnostic.parameters(part).find(one.name);
+    if (declared == nullptr) {
+      std::vector<std::string_view> known;
+      for (const auto& [declaredName, ignored] : diagnostic.parameters(part)) known.push_back(declaredName);
+      explanation.document->fail(one.path, name + " has no such parameter" + suggestion(one.name, known), one.path);
+    }
+    if (declared->required() && one.range.defaultValue()) {
+      explanation.document->fail(one.path, "the parameter is required and can have no default.", one.path);
+    }
+    if (diagnostic.ranges(part).find(one.name) == nullptr) diagnostic.ranges(part).set(one.name, one.range);
+  }
+}
+
 std::optional<std::int64_t> integerOf(std::string_view text) {
   std::int64_t number = 0;
   const auto [end, problem] = std::from_chars(text.data(), text.data() + text.size(), number);
@@ -159,10 +219,6 @@ std::vector<const Explanation*> thoseThat(const std::vector<Explanation>& explan
     if (fits(one)) found.push_back(&one);
   }
   return found;
-}
-
-bool holds(const std::vector<std::string>& texts, const std::string& text) {
-  return std::ranges::find(texts, text) != texts.end();
 }
 
 // A domain's name without the suffix that all domains share.
@@ -219,23 +275,32 @@ std::string nearestDomain(const std::vector<Explanation>& explanations, const st
 std::string keyOf(std::string_view domain, std::int64_t code) { return formatMessage("%@:%@", domain, code); }
 
 std::vector<Explanation> parseExplanations(const std::string& file, std::string_view text) {
-  return explanationsOf(JsonCursor(JsonDocument(std::string(text), file)));
+  const auto document = std::make_shared<const JsonDocument>(std::string(text), file);
+  std::vector<Explanation> explanations = explanationsOf(JsonCursor(*document));
+  for (Explanation& one : explanations) one.document = document;
+  return explanations;
 }
 
 std::vector<Explanation> readExplanations(const std::vector<std::filesystem::path>& directories) {
-  std::vector<Explanation> all;
-  std::map<std::string, std::string> seen;  // from each explained error or name to its file
-  for (const std::filesystem::path& file : filesIn(directories)) {
-    for (Explanation& one : explanationsOf(JsonCursor(JsonDocument::read(file)))) {
-      for (const std::string& key : keysOf(one)) {
-        const auto [earlier, isNew] = seen.emplace(key, file.string());
-        if (!isNew) refuse(file.string(), "'" + key + "' is already explained in '" + earlier->second + "'.");
-      }
-      all.push_back(std::move(one));
-    }
-  }
+  std::vector<Explanation> all = explanationsIn(filesIn(directories), [](const std::string&) { return true; });
   if (all.empty()) refuse(directories.back().string(), "the directory contains none.");
   return all;
+}
+
+void addExplainedRanges(const std::vector<std::filesystem::path>& directories,
+                        std::vector<DescribedDiagnostic>& diagnostics) {
+  std::vector<std::filesystem::path> existing = directories;
+  std::erase_if(existing, [](const std::filesystem::path& one) {
+    std::error_code ignored;
+    return !std::filesystem::is_directory(one, ignored);
+  });
+  const std::vector<Explanation> explanations = explanationsIn(filesIn(existing), mayHaveParameters);
+  for (DescribedDiagnostic& diagnostic : diagnostics) {
+    if (!diagnostic.description.isAsked || diagnostic.description.error != nullptr) continue;
+    for (const Part part : kParts) {
+      for (const Explanation& one : explanations) addRanges(one, part, diagnostic);
+    }
+  }
 }
 
 std::vector<const Explanation*> findExplanations(const std::vector<Explanation>& explanations,

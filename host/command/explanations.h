@@ -2,9 +2,14 @@
 // docs/explanations.md describes the file format.
 #pragma once
 
+#include "base/json/json_document.h"
+#include "contract/parameter_range.h"
+#include "host/plugin/parameters.h"
+
 #include <cstdint>
 #include <filesystem>
 #include <functional>
+#include <memory>
 #include <string>
 #include <string_view>
 #include <vector>
@@ -16,6 +21,13 @@ struct ExplainedMessage {
   std::string text;               // "..." marks the variable parts
   std::vector<std::string> from;  // the diagnostics and experiments that report it
   std::string meaning;            // empty if the message needs no explanation
+};
+
+// What a parameter of an experiment or analysis accepts.
+struct ExplainedParameter {
+  std::string name;
+  QZParameterRange range;
+  std::string path;  // in the document, for mistakes that are found later
 };
 
 // One explanation. An error has a domain and a code, everything else has names.
@@ -35,6 +47,9 @@ struct Explanation {
   std::vector<std::string> causes;  // the most likely first
   std::vector<std::string> next;    // steps, in order
 
+  std::vector<ExplainedParameter> parameters;  // of an experiment or analysis
+  std::shared_ptr<const JsonDocument> document;
+
   bool isError() const { return !domain.empty(); }
 };
 
@@ -49,6 +64,13 @@ std::vector<Explanation> parseExplanations(const std::string& file, std::string_
 // of the same name in later directories. Throws InputError if a file cannot be read, if there are no explanations, or
 // if two explain the same thing.
 std::vector<Explanation> readExplanations(const std::vector<std::filesystem::path>& directories);
+
+// Gives the described parameters for which the plug-in gives no range that of the explanations, if there is one. Reads
+// only files that contain parameters, so that a mistake in another does not stop a run; nothing if there are none.
+// Throws InputError like readExplanations(), or if an explanation names a parameter that the experiment or analysis
+// does not have, or a default for a required one.
+void addExplainedRanges(const std::vector<std::filesystem::path>& directories,
+                        std::vector<DescribedDiagnostic>& diagnostics);
 
 // The explanations that `asked` selects, in their order. `asked` is DOMAIN:CODE, a code, a domain, a name, a pattern of
 // names (*, ?, [...]) or the name of a code in the source. Throws a CommandError (kUsage), which suggests the nearest

@@ -4,6 +4,7 @@ import fcntl
 import json
 import os
 import pathlib
+import resource
 import subprocess
 import unittest
 
@@ -90,6 +91,39 @@ class OutputFilesTest(CommandLineTest):
                 self.assertTrue(text.startswith("before\n"), text)
                 self.assertIn("Fake.One", text[:text.index("{")])  # the verdict
                 self.assertEqual(json.loads(text[text.index("{"):])["diagnostics"][0]["name"], "Fake.One")
+
+    def test_a_limit_on_file_sizes_is_an_error_of_every_output(self):
+        """SIGXFSZ ends no command: each says which file it could not write, and exits with 73."""
+        def limited():
+            resource.setrlimit(resource.RLIMIT_FSIZE, (10, 10))
+
+        run = ["run", "Fake.One", *PLUGIN, "--phone", self.phone, "--profile", "none", "--set", "duration=1"]
+        out = self.directory / "out"
+        rows = {form: [*run, "--output", f"{form}:{out}"] for form in ("text", "json", "csv", "junit", "ocp")}
+        rows |= {
+            "record": [*run, "--record", out],
+            "list": ["list", *PLUGIN, "--format", "json", "--output", out],
+            "describe": ["describe", "Fake.One", *PLUGIN, "--profile", "none", "--output", out],
+            "explain": ["explain", "QuazorHostErrorDomain:6", "--output", out],
+            "analyze": ["analyze", self.record, *PLUGIN, "--format", "json", "--output", out],
+        }
+        for name, arguments in rows.items():
+            with self.subTest(name):
+                out.unlink(missing_ok=True)
+                result = quazor(*arguments, preexec_fn=limited)
+                self.assertEqual(result.returncode, 73, result.stderr)
+                self.assertIn(f"{out}' cannot be written: File too large", result.stderr)
+                self.assertEqual(list(self.directory.glob(".*.tmp")), [], "nothing half-written is left")
+        for arguments in (run, ["list"], ["describe", "Fake.One", *PLUGIN, "--profile", "none"], ["--help"],
+                          ["explain", "QuazorHostErrorDomain:6"], ["completion", "bash"]):
+            with self.subTest(arguments), open(out, "w", encoding="utf-8") as stream:
+                result = quazor(*arguments, stdout=stream, preexec_fn=limited)
+                self.assertEqual(result.returncode, 73, result.stderr)
+                self.assertIn("quazor: standard output cannot be written", result.stderr)
+        last = self.directory / "state"
+        result = quazor(*run, preexec_fn=limited, env={"XDG_STATE_HOME": str(last)})
+        self.assertEqual(result.returncode, 0, "nobody asked for the record of the last run")
+        self.assertEqual(list((last / "quazor").glob(".*.tmp")), [])
 
     def test_a_working_folder_that_was_deleted(self):
         folder = self.directory / "deleted"

@@ -187,6 +187,18 @@ class ProcessTest(CommandLineTest):
         record, = json.loads(self.output.read_text())["diagnostics"]
         self.assertEqual((record["name"], record["error"]["code"]), ("working_plugin.so", 12))
 
+    def test_a_late_log_line_is_not_filed_with_the_next_diagnostic(self):
+        """The timeout of the first is reached while the second runs."""
+        record = self.directory / "r.jsonl"
+        ran = quazor("run", "TesselFaultDiagnostic", "CameraSyncDiagnostic.Back", "--in-process", "--realtime", "--profile",
+                     "none", "--set", "frameCount=3", "--set", "timeout=1", "--set", "duration=2", "--record", record)
+        self.assertEqual(ran.returncode, 0, ran.stderr)
+        events = events_in(record)
+        second = next(i for i, one in enumerate(events) if one.get("name") == "CameraSyncDiagnostic.Back")
+        texts = [one["text"] for one in events[second:] if one["event"] == "log"]
+        self.assertNotEqual(texts, [])
+        self.assertNotIn("Timeout has been reached.", texts)
+
     def test_a_plugin_cannot_end_a_run_without_an_error(self):
         for line in ('{"says":"refused","code":0,"text":"nothing to do"}', '{"says":"registered","registrations":[]}',
                      '{"says":"catalogue","catalogue":[]}\n{"says":"done"}'):

@@ -131,16 +131,36 @@ class VerifyTest(RecordTest):
         self.assertEqual((result.returncode, result.stderr), (1, ""))
         self.assertEqual(result.stdout.splitlines()[0], f"WRONG  the record '{record}', {sentence}")
 
+    def test_a_record_of_a_later_version_is_refused_with_both_versions(self):
+        def later(events):
+            events[0]["record"] = 3
+            events[2]["event"] = "somethingNew"
+
+        record = self.changed(later)
+        wrote = json.loads(record.read_text().splitlines()[0])["program"]
+        sentence = (f"the record '{record}' says version 3, but this program reads versions 1 to 2; read it with the quazor "
+                    f"that wrote it, {wrote}, or a later one")
+        for arguments in (["verify", record], ["diff", self.record, record], ["diff", record, self.record],
+                          ["analyze", record, "--plugin", WORKING], ["run", "--only", "failed", "--of", record]):
+            with self.subTest(arguments[0]):
+                result = quazor(*arguments)
+                self.assertEqual((result.returncode, result.stdout, result.stderr), (66, "", f"quazor: {sentence}\n"))
+        result = quazor("verify", record, self.record)
+        self.assertEqual(result.returncode, 66)
+        self.assertIn(f"UNREADABLE  {record}: {sentence}\n", result.stdout)
+
+    def test_an_event_that_a_known_version_does_not_have_is_a_line_that_is_wrong(self):
+        def unknown(events):
+            events[2]["event"] = "somethingNew"
+
+        self.assert_wrong(self.changed(unknown), "line 3: unknown event 'somethingNew'")
+
     def test_lines_that_are_wrong(self):
         def missing_line(events):
             del events[3]
 
-        def other_form(events):
-            events[0]["record"] = 3
-
         self.assert_wrong(self.changed(missing_line),
                           "line 4: the sequence number is 4 instead of 3; a line is missing or has been moved")
-        self.assert_wrong(self.changed(other_form), "line 1: the record has format 3, but this program reads formats 1 to 2")
         self.assert_wrong(self.write("text", "hello\n"), "line 1: not valid JSON")
         self.assert_wrong(self.write("document", "{}\n"), "line 1: \"record\" is missing")
         self.assert_wrong(WORKING, "line 1: not valid JSON")

@@ -1,6 +1,7 @@
 #include "host/command/selection.h"
 
 #include "base/text/nearest_name.h"
+#include "host/command/explanations.h"
 #include "host/plugin/plugin_loader.h"
 #include "host/plugin/plugin_trust.h"
 #include "host/plugin/profile.h"
@@ -164,6 +165,7 @@ Selection select(const Options& options, const Installation& installation, Watch
   const std::vector<Diagnostic> wanted = wantedOf(catalogue, options, !scan.failed.empty());
   const std::vector<Profile> profiles = profilesOf(options, installation);
   describeForProfiles(options, installation, profiles, described, signals);
+  addExplainedRanges(installation.explanations(), described);
   for (const Profile& profile : profiles) checkProfile(profile, described);
   std::vector<ParameterOverride> settings = overridesOfEnvironment();
   settings.insert(settings.end(), options.settings.begin(), options.settings.end());

@@ -208,6 +208,7 @@ class Selftest {
     RunOptions runOptions;
     runOptions.makePhone = phonesOfScenario(file, false, seed, installation_.scenarioSource());
     runOptions.logLevel = LogLevel::kError;
+    runOptions.logLimit = options_.logLimit;
     return recordOfRun(described, parameters, runOptions, seed, isolation_, signals_);
   }
 

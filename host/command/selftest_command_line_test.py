@@ -13,6 +13,7 @@ import unittest
 from command_line_fixture import PROGRAM, CommandLineTest, quazor
 
 DROPPED = "camera_sync/frames_dropped"
+STOP_REFUSED = "camera_sync/stop_refused"
 REFUSED = "camera_sync/start_refused_on_first"
 
 
@@ -38,6 +39,20 @@ class SelftestTest(CommandLineTest):
         self.assertEqual((phone["phone"], phone["expectsDetection"]), (DROPPED, False))
         self.assertTrue(any("BackTele.Total" in one for one in phone["reasons"]), phone)
         self.assertFalse(document["interrupted"])
+
+
+    def test_the_limit_on_log_lines_holds_in_this_process_too(self):
+        def reasons(*arguments):
+            result = quazor("selftest", STOP_REFUSED, "--seeds", "1", "--format", "json", *arguments)
+            self.assertEqual(result.returncode, 0, result.stderr)
+            return [one.rsplit(": ", 1)[-1] for one in json.loads(result.stdout)["phones"][0]["reasons"]]
+
+        everything = reasons()
+        self.assertEqual(len(everything), 2)
+        self.assertEqual(reasons("--in-process"), everything)
+        limited = [everything[0], "1 more log line was left out (--log-limit)"]
+        self.assertEqual(reasons("--log-limit", "1"), limited)
+        self.assertEqual(reasons("--log-limit", "1", "--in-process"), limited)
 
 
 class InterruptedSelftestTest(CommandLineTest):

@@ -33,6 +33,7 @@ enum class HostErrorCode : std::int64_t {
   kLimitWithoutResult = 14,  // a user-defined limit fits no result of the run
   kPluginRefused = 15,       // a file in a folder of plug-ins was refused, so none of its code ran or counts
   kParameterMissing = 16,    // a required parameter has no value
+  kBadRange = 17,            // the plug-in gives a range of a parameter that is nonsense
 };
 
 DiagnosticErrorPtr hostError(HostErrorCode code, std::string message);

@@ -1,9 +1,11 @@
 #include "host/plugin/diagnostic_registry.h"
 
+#include "base/text/input_error.h"
 #include "base/text/nearest_name.h"
 #include "host/error/exit_code.h"
 #include "host/error/host_error.h"
 #include "host/plugin/null_platform.h"
+#include "host/plugin/parameter_range.h"
 
 #include <fnmatch.h>
 
@@ -77,6 +79,31 @@ std::string_view nounOf(Wanted wanted) {
                      "there is no " + noun + " " + quoted + didYouMean(name, namesOf(reachable(catalogue, wanted))));
 }
 
+bool failNothingMade(const std::string& name, DiagnosticErrorPtr* error) {
+  *error = hostError(HostErrorCode::kNothingMade, "the factory of " + name + " returned no object");
+  return false;
+}
+
+// What an experiment or analysis says about its parameters, if it says anything.
+template <class Made>
+OrderedMap<QZParameterRange> rangesOf(const Made& made) {
+  const auto* const ranges = dynamic_cast<const QZParameterRanges*>(&made);
+  return ranges == nullptr ? OrderedMap<QZParameterRange>() : ranges->parameterRanges();
+}
+
+// Stores an error and clears the ranges if one is nonsense.
+bool checkRanges(const std::string& name, OrderedMap<QZParameterRange>& ranges, const QZDescription& description,
+                 DiagnosticErrorPtr* error) {
+  try {
+    validateRanges(ranges, description);
+    return true;
+  } catch (const InputError& problem) {
+    *error = hostError(HostErrorCode::kBadRange, name + " gives " + problem.what());
+    ranges = {};
+    return false;
+  }
+}
+
 }  // namespace
 
 std::vector<Diagnostic> catalogueOf(const QZLab& lab) {
@@ -107,26 +134,22 @@ std::optional<Diagnostic> registeredDiagnostic(const QZLab& lab, const Diagnosti
 DiagnosticDescription describeDiagnostic(const Diagnostic& diagnostic) {
   DiagnosticDescription description;
   installPlatform(nullPlatform());
-  callPlugin("describing " + diagnostic.experimentName, &description.error, [&](DiagnosticErrorPtr* error) {
-    const std::shared_ptr<QZExperiment> experiment = diagnostic.makeExperiment();
-    if (experiment == nullptr) {
-      *error =
-          hostError(HostErrorCode::kNothingMade, "the factory of " + diagnostic.experimentName + " returned no object");
-      return false;
-    }
-    description.experiment = experiment->experimentDescription();
-    return true;
-  });
-  if (description.error != nullptr || diagnostic.experimentOnly) return description;
+  const bool isDescribed =
+      callPlugin("describing " + diagnostic.experimentName, &description.error, [&](DiagnosticErrorPtr* error) {
+        const std::shared_ptr<QZExperiment> experiment = diagnostic.makeExperiment();
+        if (experiment == nullptr) return failNothingMade(diagnostic.experimentName, error);
+        description.experiment = experiment->experimentDescription();
+        description.experimentRanges = rangesOf(*experiment);
+        return checkRanges(diagnostic.experimentName, description.experimentRanges, description.experiment, error);
+      });
+  if (!isDescribed) description.experiment = QZDescription("");
+  if (!isDescribed || diagnostic.experimentOnly) return description;
   callPlugin("describing " + diagnostic.analysisName, &description.error, [&](DiagnosticErrorPtr* error) {
     const std::shared_ptr<QZAnalysis> analysis = diagnostic.makeAnalysis();
-    if (analysis == nullptr) {
-      *error =
-          hostError(HostErrorCode::kNothingMade, "the factory of " + diagnostic.analysisName + " returned no object");
-      return false;
-    }
+    if (analysis == nullptr) return failNothingMade(diagnostic.analysisName, error);
     description.analysis = analysis->analysisDescription();
-    return true;
+    description.analysisRanges = rangesOf(*analysis);
+    return checkRanges(diagnostic.analysisName, description.analysisRanges, description.analysis, error);
   });
   return description;
 }

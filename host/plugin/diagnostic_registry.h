@@ -2,6 +2,7 @@
 #pragma once
 
 #include "contract/lab.h"
+#include "contract/parameter_range.h"
 
 #include <chrono>
 #include <cstdint>
@@ -37,8 +38,11 @@ struct Cost {
 struct DiagnosticDescription {
   QZDescription experiment{""};
   QZDescription analysis{""};
-  DiagnosticErrorPtr error;    // why there is no description; null if there is one
-  bool isAsked = true;         // false if no description was requested; all other members are then empty
+  DiagnosticErrorPtr error;  // why there is no description; null if there is one
+  bool isAsked = true;       // false if no description was requested; all other members are then empty
+  // What the parameters accept, where it is known.
+  OrderedMap<QZParameterRange> experimentRanges{};
+  OrderedMap<QZParameterRange> analysisRanges{};
   std::optional<Cost> cost{};  // of asking; nothing if it was not measured
 };
 

@@ -4,6 +4,7 @@
 #include "base/text/nearest_name.h"
 #include "contract/message_format.h"
 #include "host/error/exit_code.h"
+#include "host/plugin/parameter_range.h"
 #include "host/text/parameter_number.h"
 
 #include <algorithm>
@@ -50,6 +51,19 @@ std::string noteOfUndescribed(const std::vector<DescribedDiagnostic>& diagnostic
   return {};
 }
 
+void checkRange(const ParameterOverride& setting, const std::vector<DescribedDiagnostic>& selected) {
+  for (const DescribedDiagnostic& one : selected) {
+    for (const Part part : kParts) {
+      if (!sets(setting, part, setting.name)) continue;
+      const std::optional<std::string> problem = rangeProblem(one, part, setting.name, setting.value);
+      if (!problem) continue;
+      throw CommandError(ExitCode::kUsage,
+                         formatMessage("%@: the parameter '%@' of %@ %@", quoted(setting.place, setting.text),
+                                       setting.name, one.diagnostic.name, *problem));
+    }
+  }
+}
+
 const Value* findIn(const Profile& profile, const Diagnostic& diagnostic, Part part, std::string_view parameter) {
   return diagnostic.experimentOnly ? profile.findForExperiment(diagnostic.name, diagnostic.usedBy, parameter)
                                    : profile.find(diagnostic.name, part, parameter);
@@ -74,12 +88,20 @@ std::vector<ResolvedParameter> resolvePart(const DescribedDiagnostic& diagnostic
         parameter.source = sourceOf(place);
       }
     }
+    if (const QZParameterRange* const range = diagnostic.ranges(part).find(name)) parameter.range = *range;
     bound.push_back(std::move(parameter));
   }
   return bound;
 }
 
 }  // namespace
+
+std::optional<std::string> rangeProblem(const DescribedDiagnostic& diagnostic, Part part, std::string_view name,
+                                        const Value& value) {
+  const QZParameterRange* const range = diagnostic.ranges(part).find(name);
+  if (range == nullptr || accepts(*range, value)) return std::nullopt;
+  return formatMessage("must be %@, not %@", rangeText(*range), value);
+}
 
 std::vector<std::string> declaredNames(const std::vector<DescribedDiagnostic>& diagnostics, std::optional<Part> part) {
   std::vector<std::string> names;
@@ -142,6 +164,7 @@ void checkOverrides(const std::vector<ParameterOverride>& settings, const std::v
                                                setting.name + "'" + didYouMean(setting.name, names) +
                                                noteOfUndescribed(selected));
     }
+    checkRange(setting, selected);
     for (std::size_t j = 0; j < i; ++j) {
       const ParameterOverride& other = settings[j];
       const bool overlap = other.place == setting.place && other.name == setting.name &&

@@ -39,8 +39,9 @@ std::vector<ParameterOverride> overridesOfEnvironment();
 struct ResolvedParameter {
   std::string name;
   QZNumberParameter declaration;
-  std::optional<Value> value;  // nothing: not set
-  std::string source;          // user-readable source of the value; empty if not set
+  std::optional<Value> value;               // nothing: not set
+  std::string source;                       // user-readable source of the value; empty if not set
+  std::optional<QZParameterRange> range{};  // nothing: not known, or the parameters are those of a record
 };
 
 struct ResolvedParameters {
@@ -56,6 +57,7 @@ struct ResolvedParameters {
 Dictionary dictionaryOf(const std::vector<ResolvedParameter>& parameters);
 
 // A diagnostic and its description.
+// Thread: one at a time.
 struct DescribedDiagnostic {
   Diagnostic diagnostic;
   DiagnosticDescription description;
@@ -68,13 +70,26 @@ struct DescribedDiagnostic {
   const OrderedMap<QZNumberParameter>& parameters(Part part) const {
     return (part == Part::kExperiment ? description.experiment : description.analysis).parameters();
   }
+
+  // What the parameters of that part accept, where it is known.
+  const OrderedMap<QZParameterRange>& ranges(Part part) const {
+    return part == Part::kExperiment ? description.experimentRanges : description.analysisRanges;
+  }
+  OrderedMap<QZParameterRange>& ranges(Part part) {
+    return part == Part::kExperiment ? description.experimentRanges : description.analysisRanges;
+  }
 };
+
+// "must be >= 0 s, not -1", the end of a sentence about the parameter, if it is known not to accept the value; else
+// nothing.
+std::optional<std::string> rangeProblem(const DescribedDiagnostic& diagnostic, Part part, std::string_view name,
+                                        const Value& value);
 
 // The names of the parameters that the diagnostics declare in that part or, without one, in any.
 std::vector<std::string> declaredNames(const std::vector<DescribedDiagnostic>& diagnostics, std::optional<Part> part);
 
-// Throws a CommandError (kUsage) if no selected diagnostic declares the parameter of a setting, or if one source sets
-// the same parameter twice.
+// Throws a CommandError (kUsage) if no selected diagnostic declares the parameter of a setting, if one that does cannot
+// accept the value, or if one source sets the same parameter twice.
 void checkOverrides(const std::vector<ParameterOverride>& settings, const std::vector<DescribedDiagnostic>& selected);
 
 // The parameters of one diagnostic or experiment. Later sources override earlier ones: the profiles in order, the

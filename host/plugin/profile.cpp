@@ -34,16 +34,28 @@ OrderedMap<Value> valuesIn(const JsonCursor& entry, std::string_view key, FirstM
   return object ? valuesOf(*object, mistakes) : OrderedMap<Value>();
 }
 
-const Value* findIn(const std::vector<ProfileEntry>& entries, const std::string& name, Part part,
-                    std::string_view parameter) {
-  const Value* found = nullptr;
+const ProfileEntry* entryIn(const std::vector<ProfileEntry>& entries, const std::string& name, Part part,
+                            std::string_view parameter) {
+  const ProfileEntry* found = nullptr;
   for (const ProfileEntry& entry : entries) {
-    const Value* value = entry.values(part).find(parameter);
-    if (value == nullptr || !matchesName(entry.name, name)) continue;
-    if (entry.name == name) return value;
-    found = value;
+    if (entry.values(part).find(parameter) == nullptr || !matchesName(entry.name, name)) continue;
+    if (entry.name == name) return &entry;
+    found = &entry;
   }
   return found;
+}
+
+const ProfileEntry* entryForExperiment(const Profile& profile, const std::string& experiment,
+                                       const std::vector<std::string>& usedBy, std::string_view parameter) {
+  const ProfileEntry* entry = entryIn(profile.experiments, experiment, Part::kExperiment, parameter);
+  for (auto user = usedBy.begin(); entry == nullptr && user != usedBy.end(); ++user) {
+    entry = entryIn(profile.entries, *user, Part::kExperiment, parameter);
+  }
+  return entry;
+}
+
+const Value* valueIn(const ProfileEntry* entry, Part part, std::string_view parameter) {
+  return entry == nullptr ? nullptr : entry->values(part).find(parameter);
 }
 
 // The limit without its name and severity.
@@ -121,17 +133,18 @@ Profile withoutMistakes(Profile profile) {
 
 std::string_view nameOf(Part part) { return part == Part::kExperiment ? "experiment" : "analysis"; }
 
+const ProfileEntry* Profile::entryFor(const Diagnostic& diagnostic, Part part, std::string_view parameter) const {
+  return diagnostic.experimentOnly ? entryForExperiment(*this, diagnostic.name, diagnostic.usedBy, parameter)
+                                   : entryIn(entries, diagnostic.name, part, parameter);
+}
+
 const Value* Profile::find(const std::string& diagnostic, Part part, std::string_view parameter) const {
-  return findIn(entries, diagnostic, part, parameter);
+  return valueIn(entryIn(entries, diagnostic, part, parameter), part, parameter);
 }
 
 const Value* Profile::findForExperiment(const std::string& experiment, const std::vector<std::string>& usedBy,
                                         std::string_view parameter) const {
-  const Value* value = findIn(experiments, experiment, Part::kExperiment, parameter);
-  for (auto user = usedBy.begin(); value == nullptr && user != usedBy.end(); ++user) {
-    value = find(*user, Part::kExperiment, parameter);
-  }
-  return value;
+  return valueIn(entryForExperiment(*this, experiment, usedBy, parameter), Part::kExperiment, parameter);
 }
 
 std::string Profile::pathOf(const ProfileEntry& entry) {

@@ -29,6 +29,8 @@
 
 namespace quazor {
 
+struct Diagnostic;
+
 // The two parts of a diagnostic, each with its own parameters.
 enum class Part { kExperiment, kAnalysis };
 inline constexpr Part kParts[] = {Part::kExperiment, Part::kAnalysis};
@@ -58,6 +60,10 @@ struct Profile {
   // The path of an entry in the document, or of the value of one of its parameters.
   static std::string pathOf(const ProfileEntry& entry);
   static std::string pathOf(const ProfileEntry& entry, Part part, std::string_view parameter);
+
+  // The entry with the value of a parameter for that diagnostic or experiment, with the rules of find() and
+  // findForExperiment(), or null.
+  const ProfileEntry* entryFor(const Diagnostic& diagnostic, Part part, std::string_view parameter) const;
 
   // The value for a parameter, or null. The entry with the exact name of the diagnostic takes precedence over patterns,
   // and a later pattern over an earlier one. An entry without the parameter is skipped.

@@ -78,6 +78,21 @@ void checkEntry(const Profile& profile, const ProfileEntry& entry, const std::ve
   for (const Part part : kParts) mistakes.of([&] { checkParameters(profile, entry, part, matched); });
 }
 
+// Checks the values that the profile gives to a diagnostic or experiment. A value that another entry overrides does not
+// count.
+void checkRanges(const Profile& profile, const DescribedDiagnostic& diagnostic, FirstMistake& mistakes) {
+  for (const Part part : kParts) {
+    for (const auto& [name, ignored] : diagnostic.ranges(part)) {
+      const ProfileEntry* const entry = profile.entryFor(diagnostic.diagnostic, part, name);
+      if (entry == nullptr) continue;
+      const std::optional<std::string> problem = rangeProblem(diagnostic, part, name, *entry->values(part).find(name));
+      if (!problem) continue;
+      const std::string path = Profile::pathOf(*entry, part, name);
+      mistakes.of([&] { fail(profile, path, *problem + ", for " + diagnostic.diagnostic.name + "."); });
+    }
+  }
+}
+
 // True if one of the diagnostics declares each parameter that the entry sets.
 bool declareAll(const std::vector<DescribedDiagnostic>& diagnostics, const ProfileEntry& entry) {
   for (const Part part : kParts) {
@@ -111,6 +126,7 @@ void checkProfile(const Profile& profile, const std::vector<DescribedDiagnostic>
   const auto check = [&](const ProfileEntry& entry) { checkEntry(profile, entry, catalogue, mistakes); };
   mistakes.inOrder(profile.entries, check);
   mistakes.inOrder(profile.experiments, check);
+  for (const DescribedDiagnostic& one : catalogue) checkRanges(profile, one, mistakes);
   try {
     mistakes.throwIfAny();
   } catch (const DocumentError& first) {

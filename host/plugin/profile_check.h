@@ -9,8 +9,9 @@
 namespace quazor {
 
 // Throws a CommandError (kCannotRead) for the first mistake in the order of the file: one of the form, an entry that
-// sets a parameter that no matching diagnostic or experiment declares or, unless the profile may name others, an entry
-// that matches none. Skips an entry if anything that it matches was not described.
+// sets a parameter that no matching diagnostic or experiment declares, a value outside the range of its parameter or,
+// unless the profile may name others, an entry that matches none. Skips an entry if anything that it matches was not
+// described.
 void checkProfile(const Profile& profile, const std::vector<DescribedDiagnostic>& catalogue);
 
 // The undescribed diagnostics that must be described before checkProfile can check an entry: those that match an entry

@@ -94,22 +94,38 @@ void addWhatFormat1Lacks(Json& json) {
   json["tags"] = Json::array();
 }
 
+// Refuses a record of a version that this program does not know. Its events and keys may be others or mean something
+// else, so a part of it that seems to be understood could be judged wrongly.
+void checkVersion(const std::filesystem::path& file, const Json& json) {
+  const Json& version = memberOf(json, "record");
+  if (!version.is_number_unsigned() || version < kFirstRecordFormat) {
+    throw InputError("the version of the record is " + version.dump() + ", but must be a number from " +
+                     std::to_string(kFirstRecordFormat));
+  }
+  if (version <= kRecordFormat) return;
+  const auto program = json.find("program");
+  const std::string writer = program != json.end() && program->is_string() ? ", " + textFrom(*program) : "";
+  throw CommandError(ExitCode::kCannotRead,
+                     "the record '" + file.string() + "' says version " + version.dump() +
+                         ", but this program reads versions " + std::to_string(kFirstRecordFormat) + " to " +
+                         std::to_string(kRecordFormat) + "; read it with the quazor that wrote it" + writer +
+                         ", or a later one");
+}
+
 RunEvent eventInLine(const std::filesystem::path& file, std::uint64_t sequence, const std::string& line) {
   try {
     Json json = parseJsonLine(line);
     if (sequence == 0) {
-      const Json& format = memberOf(json, "record");
-      if (!format.is_number_unsigned() || format < kFirstRecordFormat || format > kRecordFormat) {
-        throw InputError("the record has format " + format.dump() + ", but this program reads formats " +
-                         std::to_string(kFirstRecordFormat) + " to " + std::to_string(kRecordFormat));
-      }
-      if (format == kFirstRecordFormat) addWhatFormat1Lacks(json);
+      checkVersion(file, json);
+      if (json["record"] == kFirstRecordFormat) addWhatFormat1Lacks(json);
     }
     if (memberOf(json, "sequence") != sequence) {
       throw InputError("the sequence number is " + memberOf(json, "sequence").dump() + " instead of " +
                        std::to_string(sequence) + "; a line is missing or has been moved");
     }
     return eventFrom(json);
+  } catch (const CommandError&) {
+    throw;
   } catch (const InputError& problem) {
     refuseLine(file, sequence + 1, problem.what());
   }

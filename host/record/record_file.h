@@ -76,8 +76,8 @@ class RecordDefect : public CommandError {
   using CommandError::CommandError;
 };
 
-// Throws a CommandError (kCannotRead) that names the file if it cannot be read or has no complete line, and a
-// RecordDefect (kCannotRead) that names file and line if a line is wrong.
+// Throws a CommandError (kCannotRead) that names the file if it cannot be read, has no complete line or says a version
+// that this program does not know, and a RecordDefect (kCannotRead) that names file and line if a line is wrong.
 // `onProgress`, which may throw, is called now and then with the number of bytes that were read.
 StoredRecord readRecord(const std::filesystem::path& file,
                         const std::function<void(std::uint64_t bytes)>& onProgress = nullptr);

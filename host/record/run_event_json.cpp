@@ -1,10 +1,11 @@
 #include "host/record/run_event_json.h"
 
 #include "base/text/input_error.h"
+#include "host/plugin/parameter_range.h"
+#include "host/record/json_members.h"
 #include "host/record/lossless_json.h"
 #include "host/text/timestamp.h"
 
-#include <concepts>
 #include <string>
 #include <string_view>
 #include <utility>
@@ -16,36 +17,10 @@ using Json = nlohmann::ordered_json;
 
 namespace {
 
-template <class T>
-bool isInteger(const Json& json) {
-  if (json.is_number_unsigned()) return std::in_range<T>(json.get<std::uint64_t>());
-  return json.is_number_integer() && std::in_range<T>(json.get<std::int64_t>());
-}
-
-template <class T>
-T get(const Json& json, const char* key) {
-  const Json& member = memberOf(json, key);
-  bool fits = true;
-  if constexpr (std::integral<T> && !std::same_as<T, bool>) fits = isInteger<T>(member);
-  try {
-    if (fits) return member.get<T>();
-  } catch (const Json::exception&) {
-  }
-  throw InputError(std::string("\"") + key + "\" has the wrong type");
-}
-
-std::string textAt(const Json& json, const char* key) { return textFrom(memberOf(json, key)); }
-
 Date dateAt(const Json& json, const char* key) {
   const std::optional<Date> date = parseTimestamp(get<std::string>(json, key));
   if (!date) throw InputError(std::string("\"") + key + "\" is not a timestamp of the years 1678 to 2261");
   return *date;
-}
-
-const Json& arrayAt(const Json& json, const char* key) {
-  const Json& array = memberOf(json, key);
-  if (!array.is_array()) throw InputError(std::string("\"") + key + "\" is not an array");
-  return array;
 }
 
 Stage stageAt(const Json& json, const char* key) {
@@ -434,12 +409,13 @@ constexpr Reader kReaders[] = {{"runBegan", readRunBegan},
                                {"diagnosticEnded", readDiagnosticEnded},
                                {"runEnded", readRunEnded}};
 
-Json halfJson(const QZDescription& description) {
+Json halfJson(const QZDescription& description, const OrderedMap<QZParameterRange>& ranges) {
   Json parameters = Json::array();
   for (const auto& [name, parameter] : description.parameters()) {
-    parameters.push_back({{"name", losslessText(name)},
-                          {"summary", losslessText(parameter.summary())},
-                          {"required", parameter.required()}});
+    const std::string& summary = parameter.summary();
+    parameters.push_back(
+        {{"name", losslessText(name)}, {"summary", losslessText(summary)}, {"required", parameter.required()}});
+    if (const QZParameterRange* const range = ranges.find(name)) parameters.back()["range"] = rangeJson(*range);
   }
   return {{"summary", losslessText(description.summary())}, {"parameters", std::move(parameters)}};
 }
@@ -447,10 +423,17 @@ Json halfJson(const QZDescription& description) {
 QZDescription halfFrom(const Json& json) {
   QZDescription description(textAt(json, "summary"));
   for (const Json& one : arrayAt(json, "parameters")) {
-    description.addParameter(QZNumberParameter(textAt(one, "summary"), get<bool>(one, "required")),
-                             textAt(one, "name"));
+    description.addParameter({textAt(one, "summary"), get<bool>(one, "required")}, textAt(one, "name"));
   }
   return description;
+}
+
+OrderedMap<QZParameterRange> rangesFrom(const Json& json) {
+  OrderedMap<QZParameterRange> ranges;
+  for (const Json& one : arrayAt(json, "parameters")) {
+    if (one.contains("range")) ranges.set(textAt(one, "name"), rangeFrom(JsonCursor(one["range"])));
+  }
+  return ranges;
 }
 
 }  // namespace
@@ -486,15 +469,17 @@ QZLab::Registration registrationFrom(const Json& json) {
 }
 
 Json descriptionJson(const DiagnosticDescription& description) {
-  return {{"experiment", halfJson(description.experiment)},
-          {"analysis", halfJson(description.analysis)},
+  return {{"experiment", halfJson(description.experiment, description.experimentRanges)},
+          {"analysis", halfJson(description.analysis, description.analysisRanges)},
           {"error", losslessError(description.error)},
           {"isAsked", description.isAsked}};
 }
 
 DiagnosticDescription descriptionFrom(const Json& json) {
-  return {halfFrom(memberOf(json, "experiment")), halfFrom(memberOf(json, "analysis")),
-          errorFrom(memberOf(json, "error")), get<bool>(json, "isAsked")};
+  const Json& experiment = memberOf(json, "experiment");
+  const Json& analysis = memberOf(json, "analysis");
+  return {halfFrom(experiment),       halfFrom(analysis),     errorFrom(memberOf(json, "error")),
+          get<bool>(json, "isAsked"), rangesFrom(experiment), rangesFrom(analysis)};
 }
 
 }  // namespace quazor

@@ -1,6 +1,7 @@
 #include "host/report/json_report.h"
 
 #include "host/model/limit_check.h"
+#include "host/plugin/parameter_range.h"
 #include "host/record/value_json.h"
 
 #include <cstddef>
@@ -91,6 +92,7 @@ Json declarationJson(const std::string& name, const QZDescription& description,
     json.push_back({{"name", one.name},
                     {"summary", one.declaration.summary()},
                     {"required", one.declaration.required()},
+                    {"range", one.range ? rangeJson(*one.range) : Json()},
                     {"value", one.value ? valueJson(*one.value) : Json()},
                     {"source", one.value ? Json(one.source) : Json()}});
   }

@@ -129,7 +129,8 @@ TEST(DescriptionDocument, HoldsExperimentsApart) {
   bound.parameters.experiment.push_back({"x", QZNumberParameter("About x.", true), Value(2.5), "profile p.json"});
   EXPECT_EQ(descriptionDocument({bound}), Json::parse(R"({"schema": 1, "diagnostics": [], "experiments": [
     {"name": "X", "summary": "About X.", "parameters": [
-      {"name": "x", "summary": "About x.", "required": true, "value": 2.5, "source": "profile p.json"}],
+      {"name": "x", "summary": "About x.", "required": true, "range": null, "value": 2.5,
+       "source": "profile p.json"}],
      "error": null}]})"));
 }
 
@@ -138,12 +139,16 @@ TEST(DescriptionDocument, HoldsDeclarationsAndValues) {
   bound.described.diagnostic = {"D", "S.", "E", "A", nullptr, nullptr};
   bound.described.description = {QZDescription("About E."), QZDescription("About A."), nullptr};
   bound.parameters.experiment.push_back({"x", QZNumberParameter("About x.", true), Value(2.5), "profile p.json"});
+  bound.parameters.experiment.back().range.emplace().setMinimum(1);
+  bound.parameters.experiment.back().range->setUnit("s");
   bound.parameters.experiment.push_back({"y", QZNumberParameter("About y.", false), std::nullopt, ""});
   EXPECT_EQ(descriptionDocument({bound}), Json::parse(R"({"schema": 1, "diagnostics": [
     {"name": "D", "summary": "S.",
      "experiment": {"name": "E", "summary": "About E.", "parameters": [
-       {"name": "x", "summary": "About x.", "required": true, "value": 2.5, "source": "profile p.json"},
-       {"name": "y", "summary": "About y.", "required": false, "value": null, "source": null}]},
+       {"name": "x", "summary": "About x.", "required": true, "range": {"minimum": 1.0, "unit": "s"}, "value": 2.5,
+        "source": "profile p.json"},
+       {"name": "y", "summary": "About y.", "required": false, "range": null, "value": null,
+        "source": null}]},
      "analysis": {"name": "A", "summary": "About A.", "parameters": []},
      "error": null}], "experiments": []})"));
 }

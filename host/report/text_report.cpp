@@ -4,6 +4,7 @@
 #include "host/error/host_error.h"
 #include "host/model/limit_check.h"
 #include "host/model/variation.h"
+#include "host/plugin/parameter_range.h"
 #include "host/report/variation_report.h"
 #include "host/text/display_width.h"
 #include "host/text/table.h"
@@ -81,6 +82,13 @@ std::size_t warningsIn(const std::vector<DiagnosticRecord>& records) {
   return warnings;
 }
 
+// What the parameter accepts, and its default.
+std::string acceptedText(const ResolvedParameter& parameter) {
+  if (!parameter.range) return "-";
+  const std::optional<double>& usual = parameter.range->defaultValue();
+  return printable(rangeText(*parameter.range) + (usual ? formatMessage(", default %@", *usual) : ""));
+}
+
 void printHalf(std::ostream& out, std::string_view title, const std::string& name, const QZDescription& description,
                const std::vector<ResolvedParameter>& parameters) {
   out << "\n  " << title << ' ' << printable(name) << '\n' << indentedLines(description.summary(), "    ");
@@ -88,13 +96,21 @@ void printHalf(std::ostream& out, std::string_view title, const std::string& nam
     out << "    It takes no parameters.\n";
     return;
   }
-  using Align = Table::Align;
-  Table table({Align::kLeft, Align::kRight, Align::kLeft, Align::kLeft});
-  table.addHeader({"Parameter", "Value", "From", "Meaning"});
+  const bool isAnyKnown = std::any_of(parameters.begin(), parameters.end(),
+                                      [](const ResolvedParameter& one) { return one.range.has_value(); });
+  std::vector<Table::Align> columns(isAnyKnown ? 5 : 4, Table::Align::kLeft);
+  columns[1] = Table::Align::kRight;
+  Table table(columns);
+  const auto withAccepted = [isAnyKnown](std::vector<std::string> cells, const std::string& accepted) {
+    if (isAnyKnown) cells.insert(cells.end() - 1, accepted);
+    return cells;
+  };
+  table.addHeader(withAccepted({"Parameter", "Value", "From", "Meaning"}, "Accepts"));
   for (const ResolvedParameter& one : parameters) {
     const std::string unset = one.declaration.required() ? "not set, required" : "not set";
-    table.addRow({printable(one.name), one.value ? defaultText(*one.value) : "-",
-                  one.value ? printable(one.source) : unset, printable(one.declaration.summary())});
+    table.addRow(withAccepted({printable(one.name), one.value ? defaultText(*one.value) : "-",
+                               one.value ? printable(one.source) : unset, printable(one.declaration.summary())},
+                              acceptedText(one)));
   }
   table.print(out, "    ");
 }

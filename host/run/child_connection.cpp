@@ -18,17 +18,14 @@ namespace {
 
 using Json = nlohmann::ordered_json;
 
-// The exit code of a child whose connection was closed.
-constexpr int kNoConnection = 113;
-
 std::string secondsText(std::chrono::nanoseconds time) {
   return defaultText(std::chrono::duration<double>(time).count()) + " s";
 }
 
 }  // namespace
 
-ConnectionWriter::ConnectionWriter(int descriptor, std::string token)
-    : descriptor_(descriptor), token_(std::move(token)), owner_(::getpid()) {
+ConnectionWriter::ConnectionWriter(int descriptor, std::string token, SharedCounter& lost)
+    : descriptor_(descriptor), token_(std::move(token)), lost_(lost), owner_(::getpid()) {
   ::fstat(descriptor_, &connection_);
 }
 
@@ -37,14 +34,20 @@ bool ConnectionWriter::isOverwritten() const {
   return ::fstat(descriptor_, &now) != 0 || now.st_dev != connection_.st_dev || now.st_ino != connection_.st_ino;
 }
 
+// Its exit code says nothing: a plug-in may choose any.
+void ConnectionWriter::endWithout() const {
+  lost_.set(1);
+  ::_exit(EXIT_FAILURE);
+}
+
 void ConnectionWriter::say(const Json& json) const {
   if (::getpid() != owner_) ::_exit(EXIT_FAILURE);
-  if (isOverwritten()) ::_exit(kNoConnection);
+  if (isOverwritten()) endWithout();
   const std::string line = token_ + json.dump(-1, ' ', false, Json::error_handler_t::replace) + "\n";
   std::string_view left = line;
   while (!left.empty()) {
     const ssize_t written = ::write(descriptor_, left.data(), left.size());
-    if (written < 0 && errno != EINTR) ::_exit(kNoConnection);
+    if (written < 0 && errno != EINTR) endWithout();
     if (written > 0) left.remove_prefix(static_cast<std::size_t>(written));
   }
 }
@@ -78,7 +81,7 @@ DiagnosticErrorPtr errorOf(const Supervised& supervised, const std::string& duri
       if (end.bySignal) {
         return hostError(HostErrorCode::kCrashed, during + " crashed: its process was terminated by " + textOf(end));
       }
-      if (end.number == kNoConnection) break;
+      if (supervised.lostConnection) break;
       return hostError(HostErrorCode::kExited, during + " ended its own process with " + textOf(end));
     }
   }

@@ -2,6 +2,7 @@
 #pragma once
 
 #include "host/error/host_error.h"
+#include "host/system/shared_counter.h"
 #include "host/system/supervision.h"
 
 #include <nlohmann/json.hpp>
@@ -23,7 +24,8 @@ namespace quazor {
 // Thread: one at a time.
 class ConnectionWriter {
  public:
-  ConnectionWriter(int descriptor, std::string token);
+  // `lost`, which is borrowed, becomes 1 when the connection is gone.
+  ConnectionWriter(int descriptor, std::string token, SharedCounter& lost);
 
   // Ends the process if the connection was closed or overwritten, or if this is a copy of the process that a plug-in
   // made.
@@ -31,10 +33,12 @@ class ConnectionWriter {
 
  private:
   bool isOverwritten() const;
+  [[noreturn]] void endWithout() const;
 
   const int descriptor_;
   struct stat connection_ {};
   const std::string token_;
+  SharedCounter& lost_;
   const pid_t owner_;
 };
 

@@ -22,8 +22,9 @@ using Json = nlohmann::ordered_json;
 std::string written(const std::function<void(const ConnectionWriter& connection)>& body) {
   const DefaultRequestsToEnd defaults;
   WatchedSignals signals;
+  SharedCounter lost;
   ChildProcess child(
-      signals, [&body](int descriptor) { body(ConnectionWriter(descriptor, "secret")); }, std::nullopt);
+      signals, [&](int descriptor) { body(ConnectionWriter(descriptor, "secret", lost)); }, std::nullopt);
   std::string text;
   Supervision supervision;
   supervision.takeLine = [&text](std::string_view line) {
@@ -58,8 +59,9 @@ TEST(ConnectionWriter, SaysNothingInACopyOfTheProcess) {
 TEST(ConnectionWriter, EndsTheProcessWhenTheConnectionIsOverwritten) {
   const DefaultRequestsToEnd defaults;
   WatchedSignals signals;
-  const auto body = [](int descriptor) {
-    const ConnectionWriter connection(descriptor, "secret");
+  SharedCounter lost;
+  const auto body = [&lost](int descriptor) {
+    const ConnectionWriter connection(descriptor, "secret", lost);
     const int other = ::open("/dev/null", O_WRONLY);
     ::dup2(other, descriptor);
     connection.say({{"a", 1}});
@@ -70,7 +72,8 @@ TEST(ConnectionWriter, EndsTheProcessWhenTheConnectionIsOverwritten) {
   supervision.takeOutput = [](std::string_view /*line*/) {};
   supervision.deadline = [end = std::chrono::steady_clock::now() + std::chrono::minutes(1)] { return end; };
   supervision.isDone = [] { return false; };
-  const Supervised end = supervise(child, signals, supervision);
+  Supervised end = supervise(child, signals, supervision);
+  end.lostConnection = lost.get() != 0;
   EXPECT_EQ(errorOf(end, "the run", {})->localizedDescription(),
             "the run closed or overwrote its process's connection to quazor");
 }

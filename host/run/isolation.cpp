@@ -246,8 +246,8 @@ bool superviseRun(const IsolationOptions& options, WatchedSignals& signals, cons
                   SharedRunState& shared, Progress& progress, RunEventSink& events) {
   const Deadlines deadlines(parameters, options.deadlines);
   std::string token;
-  const auto speak = [&body, &token](int descriptor) {
-    const ConnectionWriter connection(descriptor, token);
+  const auto speak = [&body, &token, &shared](int descriptor) {
+    const ConnectionWriter connection(descriptor, token, shared.lost);
     EventsToConnection toParent(connection);
     body(toParent);
   };
@@ -264,6 +264,7 @@ bool superviseRun(const IsolationOptions& options, WatchedSignals& signals, cons
   IsolatedRun run(diagnostic, deadlines, options, token, shared.interrupted, progress, events);
   Supervised end = supervise(*child, signals, run.supervision(signals));
   child.reset();  // ends what the process has left behind
+  end.lostConnection = shared.lost.get() != 0;
   end = withInterrupt(end, run.isCompleted() && signals.requestsToEnd() > 0);
   run.conclude(end, shared.leftOut.get());
   return end.how != SupervisionEnd::kInterrupted;

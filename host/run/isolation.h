@@ -33,6 +33,7 @@ struct IsolationOptions {
 struct SharedRunState {
   SharedCounter interrupted;  // 1 once the user has interrupted the run
   SharedCounter leftOut;      // the number of log lines that the process did not send
+  SharedCounter lost;         // 1 if the process ended itself because its connection was gone
 };
 
 // Calls `body` in a separate process and passes on the events that it sends, from the first stage to

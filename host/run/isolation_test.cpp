@@ -191,6 +191,8 @@ TEST_F(RunTest, TurnsEachEndOfItsProcessIntoAFailureOfTheStage) {
       {"a crash", 1,
        "QuazorHostErrorDomain 6 the stage run of Unruly crashed: its process was terminated by signal 6 (SIGABRT)"},
       {"an exit", 2, "QuazorHostErrorDomain 7 the stage run of Unruly ended its own process with exit code 3"},
+      {"an exit with 113", 18,
+       "QuazorHostErrorDomain 7 the stage run of Unruly ended its own process with exit code 113"},
       {"a run that does not end", 3, "QuazorHostErrorDomain 8 the stage run of Unruly exceeded its deadline of 0.1 s"},
       {"a closed connection", 4,
        "QuazorHostErrorDomain 9 the stage run of Unruly closed or overwrote its process's connection to quazor"},

@@ -20,6 +20,7 @@ bool LogCap::admits(std::size_t bytes) {
 
 void LimitedLog::onEvent(const RunEvent& event) {
   const auto* const logged = std::get_if<Logged>(&event);
+  if (logged != nullptr) lastLine_ = logged->line.time;
   if (logged == nullptr || cap_.admits(logged->line.text.size())) {
     events_.onEvent(event);
   } else {

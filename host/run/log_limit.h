@@ -44,10 +44,14 @@ class LimitedLog final : public RunEventSink {
 
   void onEvent(const RunEvent& event) override;
 
+  // The time of the last line, also if it was left out.
+  std::chrono::nanoseconds lastLine() const { return lastLine_; }
+
  private:
   RunEventSink& events_;
   LogCap cap_;
   SharedCounter& leftOut_;
+  std::chrono::nanoseconds lastLine_{};
 };
 
 // The host's log line about `count` lines that were left out. `time` is that of the last line of the log.

@@ -46,7 +46,8 @@ struct Conversation {
 // Throws std::system_error if the process cannot be created.
 Supervised converse(const IsolationOptions& options, WatchedSignals& signals, const Conversation& conversation) {
   const std::string token = randomIdentifier();
-  const auto speak = [&](int descriptor) { conversation.speak(ConnectionWriter(descriptor, token)); };
+  SharedCounter lost;
+  const auto speak = [&](int descriptor) { conversation.speak(ConnectionWriter(descriptor, token, lost)); };
   ChildProcess child(signals, speak, options.memory, isCleanupProcess);
   Supervision supervision;
   supervision.takeLine = [&](std::string_view line) {
@@ -62,7 +63,9 @@ Supervised converse(const IsolationOptions& options, WatchedSignals& signals, co
   supervision.takeOutput = [](std::string_view /*line*/) {};  // there is no run log to write to
   supervision.deadline = conversation.deadline;
   supervision.isDone = [] { return false; };  // what it said counts if it ends well
-  return supervise(child, signals, supervision);
+  Supervised end = supervise(child, signals, supervision);
+  end.lostConnection = lost.get() != 0;
+  return end;
 }
 
 // The memory of this process that is in use, in bytes; 0 if that is unknown.

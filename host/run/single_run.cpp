@@ -1,6 +1,8 @@
 #include "host/run/single_run.h"
 
 #include "host/model/record_builder.h"
+#include "host/run/log_limit.h"
+#include "host/system/shared_counter.h"
 #include "host/text/timestamp.h"
 
 namespace quazor {
@@ -13,7 +15,10 @@ DiagnosticRecord recordOfRun(const DescribedDiagnostic& described, const Resolve
   builder.onEvent(DiagnosticStarted{diagnostic.name, described.summary(), diagnostic.experimentName,
                                     diagnostic.analysisName, diagnostic.experimentOnly, parameters, seed, dateNow()});
   if (signals == nullptr) {
-    runDiagnostic(diagnostic, parameters, runOptions, builder);
+    SharedCounter leftOut;
+    LimitedLog limited(builder, runOptions.logLimit, leftOut);
+    runDiagnostic(diagnostic, parameters, runOptions, limited);
+    if (leftOut.get() > 0) builder.onEvent(leftOutLine(leftOut.get(), limited.lastLine()));
   } else {
     Progress noProgress(nullptr);
     runIsolated(isolation, *signals, diagnostic, parameters, runOptions, nullptr, noProgress, builder);

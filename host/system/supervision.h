@@ -44,6 +44,7 @@ enum class SupervisionEnd {
 struct Supervised {
   SupervisionEnd how = SupervisionEnd::kEnded;
   std::optional<ProcessEnd> end;  // nothing if the child could not be killed
+  bool lostConnection = false;    // the child ended itself because its connection was gone
 };
 
 // Supervises the child until it has ended. To end it, sends SIGTERM to its process group and, half a second later,

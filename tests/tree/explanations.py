@@ -122,6 +122,8 @@ def name_problems(entries, registered, results):
 def texts_of(value):
     if isinstance(value, str):
         return [value]
+    if isinstance(value, (bool, int, float)):
+        return []
     return [text for part in (value.values() if isinstance(value, dict) else value) for text in texts_of(part)]
 
 

@@ -83,7 +83,7 @@ for name, below in {
     "limits": ["error", "text"],
     "plugin": ["error", "limits", "text"],
     "model": ["device", "error", "limits", "plugin", "text"],
-    "record": ["error", "limits", "model", "system", "text"],
+    "record": ["error", "limits", "model", "plugin", "system", "text"],
     "report": ["device", "error", "limits", "model", "plugin", "record", "system", "text"],
     "run": ["device", "error", "limits", "model", "plugin", "record", "report", "system", "text"],
     "cli": ["device", "error", "limits", "plugin", "report", "run", "system", "text"],

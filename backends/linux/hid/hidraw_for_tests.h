@@ -55,6 +55,9 @@ class HidrawTree {
   HidrawTree& operator=(const HidrawTree&) = delete;
   ~HidrawTree() { std::filesystem::remove_all(folder_); }
 
+  // Lets every user look for the nodes, not only the owner of this process.
+  void openToAll() const { std::filesystem::permissions(folder_, std::filesystem::perms(0755)); }
+
   HidrawRoots roots() const { return {folder_ / "sys", folder_ / "dev"}; }
   std::filesystem::path path(const std::string& node) const { return roots().devices / node; }
   std::filesystem::path classEntry(const std::string& node) const { return roots().sysfs / "class" / "hidraw" / node; }

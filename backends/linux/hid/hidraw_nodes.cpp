@@ -55,9 +55,9 @@ std::string nameFrom(const fs::path& uevent) {
   return {};
 }
 
-std::string reasonOfNoAccess(const fs::path& path) {
-  if (::faccessat(AT_FDCWD, path.c_str(), R_OK | W_OK, AT_EACCESS) == 0) return {};
-  return std::strerror(errno);
+// The error number of opening the node; 0 if this user can.
+int problemOfAccess(const fs::path& path) {
+  return ::faccessat(AT_FDCWD, path.c_str(), R_OK | W_OK, AT_EACCESS) == 0 ? 0 : errno;
 }
 
 std::optional<HidrawNode> nodeOf(const HidrawRoots& roots, const std::string& name) {
@@ -74,7 +74,10 @@ std::optional<HidrawNode> nodeOf(const HidrawRoots& roots, const std::string& na
   } catch (const InputError& problem) {
     node.problem = problem.what();
   }
-  node.noAccess = reasonOfNoAccess(node.path);
+  if (const int problem = problemOfAccess(node.path); problem != 0) {
+    node.noAccess = std::strerror(problem);
+    node.isForbidden = problem == EACCES || problem == EPERM;
+  }
   return node;
 }
 

@@ -25,6 +25,7 @@ struct HidrawNode {
   HidReportDescriptor descriptor;  // empty if there is a problem
   std::string problem;             // why the report descriptor is invalid; empty if it is valid
   std::string noAccess;            // why this user cannot open it; empty if possible
+  bool isForbidden = false;        // it could be opened with other permissions
 };
 
 // True if the kernel supports hidraw.

@@ -10,6 +10,7 @@
 #include "contract/message_format.h"
 
 #include <algorithm>
+#include <cerrno>
 #include <optional>
 #include <string_view>
 #include <utility>
@@ -92,7 +93,7 @@ class Probe {
       if (!node.problem.empty()) tell("    unsuitable: " + node.problem);
       if (node.noAccess.empty()) continue;
       tell("    unsuitable: " + node.noAccess);
-      tell("    docs/linux.md has a udev rule that assigns it to a group.");
+      if (node.isForbidden) tell("    docs/linux.md has a udev rule that assigns it to a group.");
     }
     if (!nodes.empty()) tell("  They need no binding: plug-ins find them by usage page and usage.");
   }
@@ -141,8 +142,12 @@ class Probe {
     if (failure != 0) {
       DiagnosticErrorPtr error;
       failSystemCall(&error, "perf_event_open", channels.front().file, failure);
-      tell("    This user may not count them: " + error->localizedDescription());
-      tell("    The capability CAP_PERFMON, or a sysctl kernel.perf_event_paranoid of 0 or -1, allows it.");
+      const bool isForbidden = failure == EACCES || failure == EPERM;
+      tell((isForbidden ? "    This user may not count them: " : "    They cannot be counted: ") +
+           error->localizedDescription());
+      if (isForbidden) {
+        tell("    The capability CAP_PERFMON, or a sysctl kernel.perf_event_paranoid of 0 or -1, allows it.");
+      }
       return;
     }
     const auto isOfCameras = [](const CounterChannel& one) { return one.file == "v4l2:v4l2_dqbuf"; };

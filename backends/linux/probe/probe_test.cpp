@@ -8,6 +8,7 @@
 #include <gmock/gmock.h>
 #include <gtest/gtest.h>
 #include <nlohmann/json.hpp>
+#include <unistd.h>
 
 #include <algorithm>
 #include <cerrno>
@@ -24,6 +25,7 @@ namespace fs = std::filesystem;
 using ::testing::Contains;
 using ::testing::ElementsAre;
 using ::testing::HasSubstr;
+using ::testing::Not;
 using ::testing::UnorderedElementsAre;
 
 class ProbeTest : public ::testing::Test {
@@ -304,6 +306,24 @@ TEST_F(ProbeTest, TellsOfHidDevices) {
   EXPECT_THAT(told, Contains(HasSubstr("hidraw1 (Damaged)")));
   EXPECT_THAT(told, Contains("    unsuitable: No such file or directory"));
   EXPECT_EQ(std::ranges::count_if(told, [](const auto& line) { return line.find("unsuitable") != line.npos; }), 2);
+  EXPECT_THAT(told, Not(Contains(HasSubstr("udev rule")))) << "no rule brings the node back";
+}
+
+TEST_F(ProbeTest, NamesTheRuleForAHidDeviceThatThisUserMayNotOpen) {
+  HidrawTree tree;
+  hid_ = tree.roots();
+  tree.connect("hidraw0", sensorDescriptor());
+  tree.openToAll();
+  fs::permissions(tree.path("hidraw0"), fs::perms::none);
+  const uid_t user = ::geteuid();
+  if (user == 0) {  // root may open everything
+    ASSERT_EQ(::seteuid(65534), 0);
+  }
+  const std::vector<std::string> told = probeMachine({kernel_, kernel_->roots(), hid_, counters_, folder_}).lines;
+  if (user == 0) {
+    ASSERT_EQ(::seteuid(0), 0);
+  }
+  EXPECT_THAT(told, Contains("    unsuitable: Permission denied"));
   EXPECT_THAT(told, Contains("    docs/linux.md has a udev rule that assigns it to a group."));
 }
 
@@ -355,6 +375,10 @@ TEST_F(ProbeTest, BindsNoTracepointThatIsNotThereOrMayNotBeCounted) {
                    "(EACCES)",
                    "    The capability CAP_PERFMON, or a sysctl kernel.perf_event_paranoid of 0 or -1, allows it."}));
   EXPECT_TRUE(binding_.tracepoints.empty());
+  counters_->tracepointFailures = {{{7, 0}, EMFILE}};
+  const std::vector<std::string> told = lines();
+  EXPECT_THAT(told, Contains(HasSubstr("    They cannot be counted: perf_event_open on v4l2:v4l2_dqbuf failed: ")));
+  EXPECT_THAT(told, Not(Contains(HasSubstr("CAP_PERFMON"))));
   counters_->failures = {{"/sys/kernel/tracing/events", EACCES}};
   EXPECT_THAT(lines(), Contains("  tracepoints: opendir on /sys/kernel/tracing/events failed: Permission denied "
                                 "(EACCES)"));
