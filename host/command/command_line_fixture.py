@@ -50,9 +50,8 @@ def start(*arguments, ignored=False, **options):
                             preexec_fn=lambda: signal.signal(signal.SIGINT, action), **options)
 
 
-def full_pipe():
-    """The reading and the writing end of a pipe that takes nothing more until somebody reads."""
-    reader, writer = os.pipe()
+def fill(writer):
+    """Fills a pipe, so that it takes nothing more until somebody reads."""
     flags = fcntl.fcntl(writer, fcntl.F_GETFL)
     fcntl.fcntl(writer, fcntl.F_SETFL, flags | os.O_NONBLOCK)
     try:
@@ -61,7 +60,6 @@ def full_pipe():
     except BlockingIOError:
         pass
     fcntl.fcntl(writer, fcntl.F_SETFL, flags)
-    return reader, writer
 
 
 def without_identity(document):

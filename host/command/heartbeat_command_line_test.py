@@ -7,7 +7,7 @@ import subprocess
 import threading
 import unittest
 
-from command_line_fixture import PROGRAM, RecordTest, events_in, full_pipe, quazor
+from command_line_fixture import PROGRAM, RecordTest, events_in, fill, quazor
 from terminal_fixture import on_terminal
 
 SECONDS = 3
@@ -77,7 +77,8 @@ class HeartbeatTest(RecordTest):
         self.assertEqual(quazor("list", "--heartbeat", "2").returncode, 64)
 
     def test_a_standard_error_that_nobody_reads_does_not_stop_the_run(self):
-        reader, writer = full_pipe()
+        reader, writer = os.pipe()
+        fill(writer)
         process = subprocess.Popen([PROGRAM, *REALTIME, "--heartbeat", "1", "--record", self.record],
                                    stdout=subprocess.PIPE, stderr=writer)
         os.close(writer)

@@ -8,7 +8,7 @@ import signal
 import time
 import unittest
 
-from command_line_fixture import PLUGINS, WORKING, CommandLineTest, events_in, full_pipe, start
+from command_line_fixture import PLUGINS, WORKING, CommandLineTest, events_in, fill, start
 from terminal_fixture import Terminal
 
 FATAL = str(PLUGINS / "fatal_plugin.so")
@@ -259,18 +259,23 @@ class BlockedOutputTest(CommandLineTest):
 
     def test_an_error_stream_that_is_not_read_does_not_delay_the_teardown(self):
         record = self.directory / "run.jsonl"
-        reader, writer = full_pipe()
-        process = start("run", "Unruly", "--plugin", UNRULY, "--phone", self.phone, "--profile", "none", "--set", "way=16",
-                        "--record", record, stderr=writer)
+        reader, writer = os.pipe()
+        process = start("run", "Fake.One", "--plugin", WORKING, "--phone", self.phone, "--profile", "none", "--realtime",
+                        "--set", "duration=6", "--grace", "60", "--record", record, stderr=writer)
         self.addCleanup(process.communicate)
         self.addCleanup(process.kill)
         self.addCleanup(os.close, reader)
+        self.assertIn(b"an error line", os.read(reader, 4096))
+        fill(writer)
         os.close(writer)
+        process.send_signal(signal.SIGINT)
         limit = time.monotonic() + 60
-        while not (record.exists() and '"runEnded"' in record.read_text()):
+        while '"runEnded"' not in record.read_text():
             self.assertLess(time.monotonic(), limit)
             time.sleep(0.01)
-        self.assertIn("teardown", [one.get("stage") for one in events_in(record) if one["event"] == "stageEnded"])
+        events = events_in(record)
+        self.assertEqual(events[-1]["interrupted"], "Fake.One")
+        self.assertIn("teardown", [one["stage"] for one in events if one["event"] == "stageEnded"])
 
     def test_a_record_that_is_not_read_does_not_keep_it_from_ending(self):
         process = start("run", "Fake.One", "--plugin", WORKING, "--phone", self.phone, "--profile", "none", "--set",
