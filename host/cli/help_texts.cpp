@@ -30,6 +30,7 @@ constexpr Example kExamples[] = {
     {"quazor phone probe", "find this machine's devices and print a starter binding"},
     {"quazor run --all --phone linux:board.json", "run on this machine's own cameras, sensors and counters"},
     {"quazor run --all --limit '*.Total >= 90'", "also judge by a limit of your own"},
+    {"quazor run --all --profile strict", "also judge by limits for totals and offsets in 3 s"},
     {"quazor run --all --record records/ --tag serial=C02X --output junit:report.xml"},
     {"quazor run --all --repeat 100", "run everything 100 times and show what varied"},
     {"quazor run --only failed", "rerun the diagnostics that did not pass last time"},

@@ -152,8 +152,8 @@ class AttemptsTest(RecordTest):
         done = self.run_script("ppfpepfp", "--repeat", "4", "--output", f"json:{self.output}")
         self.assertIn("What varied between the repetitions:\n"
                       "Scripted.One: 1 passed, 2 failed, 1 ended in an error\n"
-                      "  Result  Values  Minimum  Median  Maximum  Unit    Limit\n"
-                      "  Value        3        1       1       10  frames  Enough: >= 5\n"
+                      "  Result  Count  Minimum  Median  Maximum  Unit    Limit\n"
+                      "  Value       3        1       1       10  frames  Enough: >= 5\n"
                       "  1 other result never varied\n"
                       "Scripted.Two: 4 passed\n"
                       "  2 results never varied\n", done.stdout)
@@ -164,12 +164,25 @@ class AttemptsTest(RecordTest):
                           for it in one["varying"]], [("Value", 3, 1, 1, 10, "Enough")])
         self.assertEqual((one["constant"], two["constant"], two["varying"]), (1, 2, []))
 
+    def test_what_varied_has_the_limits_of_the_user(self):
+        done = self.run_script("ppfp", "--repeat", "2", "--limit", "Scripted.One:Value >= 3 frames", "--limit",
+                               "Value == 10 +- 9", "--output", f"json:{self.output}")
+        self.assertIn("  Result  Count  Minimum  Median  Maximum  Unit    Limit\n"
+                      "  Value       2        1     5.5       10  frames  Enough: >= 5\n"
+                      "  Value       2        1     5.5       10  frames  Value >= 3 frames (command line)\n"
+                      "  Value       2        1     5.5       10  frames  Value == 10 +- 9 (command line)\n"
+                      "  1 other result never varied\n", done.stdout)
+        one, _ = json.loads(self.output.read_text())["variation"]
+        self.assertEqual(one["varying"][0]["userLimits"],
+                         [{"limit": "Scripted.One:Value >= 3 frames", "name": "", "severity": "fail", "source": "command line"},
+                          {"limit": "Value == 10 +- 9", "name": "", "severity": "fail", "source": "command line"}])
+
     def test_experiments_are_tried_again_and_repeated(self):
         done = self.run_script("epf", "--attempts", "2", "--repeat", "2", names=("ScriptedExperiment",),
                                command="experiment")
         self.assertEqual(done.returncode, 2, done.stderr)
         self.assertIn("ScriptedExperiment: 1 returned a result, 1 flaky\n", done.stdout)
-        self.assertIn("  Value        2        1     5.5       10  frames  -\n", done.stdout)
+        self.assertIn("  Value       2        1     5.5       10  frames  -\n", done.stdout)
         self.assertIn("2 runs: 1 returned a result, 0 ended in an error, 1 flaky\n", done.stdout)
 
     def test_only_what_counts_is_run_again(self):

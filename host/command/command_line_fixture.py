@@ -3,6 +3,7 @@
 CTest passes the program and the directory of the test plug-ins in the environment.
 """
 
+import fcntl
 import json
 import os
 import pathlib
@@ -44,8 +45,21 @@ def quazor(*arguments, **options):
 def start(*arguments, ignored=False, **options):
     """Starts the program. SIGINT has its default action in it or, like in a background job of a shell, is ignored."""
     action = signal.SIG_IGN if ignored else signal.SIG_DFL
-    return subprocess.Popen([PROGRAM, *map(str, arguments)], stdout=subprocess.PIPE, stderr=subprocess.PIPE, text=True,
+    options = {"stdout": subprocess.PIPE, "stderr": subprocess.PIPE, **options}
+    return subprocess.Popen([PROGRAM, *map(str, arguments)], text=True,
                             preexec_fn=lambda: signal.signal(signal.SIGINT, action), **options)
+
+
+def fill(writer):
+    """Fills a pipe, so that it takes nothing more until somebody reads."""
+    flags = fcntl.fcntl(writer, fcntl.F_GETFL)
+    fcntl.fcntl(writer, fcntl.F_SETFL, flags | os.O_NONBLOCK)
+    try:
+        while True:
+            os.write(writer, b"x" * 4096)
+    except BlockingIOError:
+        pass
+    fcntl.fcntl(writer, fcntl.F_SETFL, flags)
 
 
 def without_identity(document):

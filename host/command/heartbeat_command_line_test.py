@@ -1,6 +1,5 @@
 """The heartbeat of a run: a line on standard error without a terminal, and an event in the record."""
 
-import fcntl
 import os
 import re
 import signal
@@ -8,7 +7,7 @@ import subprocess
 import threading
 import unittest
 
-from command_line_fixture import PROGRAM, RecordTest, events_in, quazor
+from command_line_fixture import PROGRAM, RecordTest, events_in, fill, quazor
 from terminal_fixture import on_terminal
 
 SECONDS = 3
@@ -79,14 +78,7 @@ class HeartbeatTest(RecordTest):
 
     def test_a_standard_error_that_nobody_reads_does_not_stop_the_run(self):
         reader, writer = os.pipe()
-        flags = fcntl.fcntl(writer, fcntl.F_GETFL)
-        fcntl.fcntl(writer, fcntl.F_SETFL, flags | os.O_NONBLOCK)
-        try:
-            while True:
-                os.write(writer, b"x" * 4096)
-        except BlockingIOError:
-            pass
-        fcntl.fcntl(writer, fcntl.F_SETFL, flags)
+        fill(writer)
         process = subprocess.Popen([PROGRAM, *REALTIME, "--heartbeat", "1", "--record", self.record],
                                    stdout=subprocess.PIPE, stderr=writer)
         os.close(writer)

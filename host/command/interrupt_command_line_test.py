@@ -8,7 +8,8 @@ import signal
 import time
 import unittest
 
-from command_line_fixture import PLUGINS, WORKING, CommandLineTest, events_in, start
+from command_line_fixture import PLUGINS, WORKING, CommandLineTest, events_in, fill, start
+from terminal_fixture import Terminal
 
 FATAL = str(PLUGINS / "fatal_plugin.so")
 UNRULY = str(PLUGINS / "unruly_plugin.so")
@@ -39,6 +40,35 @@ class InterruptTest(CommandLineTest):
         events = events_in(self.record)
         self.assertEqual((events[-1]["event"], events[-1]["interrupted"]), ("runEnded", "Fake.One"))
         return out
+
+    def test_the_first_says_at_once_how_long_it_takes(self):
+        process = start("run", "Fake.One", "--plugin", WORKING, "--phone", self.phone, "--profile", "none", "--realtime",
+                        "--set", "duration=60", "--grace", "60")
+        self.addCleanup(process.communicate)
+        self.addCleanup(process.kill)
+        self.assertIn("an error line", process.stderr.readline())
+        process.send_signal(signal.SIGINT)
+        self.assertEqual(process.stderr.readline(), self.notice("60"))
+        self.assertIsNone(process.poll())
+        process.send_signal(signal.SIGINT)
+        out, err = process.communicate(timeout=50)
+        self.assertEqual(process.returncode, 130, out)
+        self.assertNotIn("Ctrl-C", err)
+
+    @staticmethod
+    def notice(grace):
+        return (f"quazor: interrupting Fake.One: its run may take up to {grace} s (--grace) to return, and then its teardown "
+                "follows; a second Ctrl-C ends it at once\n")
+
+    def test_a_terminal_shows_it_too(self):
+        terminal = Terminal(400, "run", "Fake.One", "--plugin", WORKING, "--phone", self.phone, "--profile", "none",
+                            "--realtime", "--set", "duration=60", "--grace", "0.5")
+        before = terminal.read_for(60, until=b"Running Fake.One")
+        self.assertIn(b"Running Fake.One", before)
+        terminal.process.send_signal(signal.SIGINT)
+        code, rest = terminal.finish()
+        self.assertEqual(code, 130, rest)
+        self.assertIn(self.notice("0.5").rstrip().encode(), rest)
 
     WAYS = ([], ["--in-process"])
 
@@ -226,6 +256,26 @@ class BlockedOutputTest(CommandLineTest):
         while any(pathlib.Path("/proc", guard).exists() for guard in guards):
             self.assertLess(time.monotonic(), limit + 60)
             time.sleep(0.01)
+
+    def test_an_error_stream_that_is_not_read_does_not_delay_the_teardown(self):
+        record = self.directory / "run.jsonl"
+        reader, writer = os.pipe()
+        process = start("run", "Fake.One", "--plugin", WORKING, "--phone", self.phone, "--profile", "none", "--realtime",
+                        "--set", "duration=6", "--grace", "60", "--record", record, stderr=writer)
+        self.addCleanup(process.communicate)
+        self.addCleanup(process.kill)
+        self.addCleanup(os.close, reader)
+        self.assertIn(b"an error line", os.read(reader, 4096))
+        fill(writer)
+        os.close(writer)
+        process.send_signal(signal.SIGINT)
+        limit = time.monotonic() + 60
+        while '"runEnded"' not in record.read_text():
+            self.assertLess(time.monotonic(), limit)
+            time.sleep(0.01)
+        events = events_in(record)
+        self.assertEqual(events[-1]["interrupted"], "Fake.One")
+        self.assertIn("teardown", [one["stage"] for one in events if one["event"] == "stageEnded"])
 
     def test_a_record_that_is_not_read_does_not_keep_it_from_ending(self):
         process = start("run", "Fake.One", "--plugin", WORKING, "--phone", self.phone, "--profile", "none", "--set",

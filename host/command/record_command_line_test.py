@@ -95,7 +95,7 @@ class VerifyTest(RecordTest):
     def test_it_counts_what_it_has_seen(self):
         result = quazor("verify", self.record)
         self.assertEqual((result.returncode, result.stderr), (0, ""))
-        self.assertRegex(result.stdout, r"^\d+ events, 1 verdict, 0 problems\n$")
+        self.assertRegex(result.stdout, r"^\d+ events, 1 verdict \(1 pass\), 0 problems\n$")
 
     def test_it_finds_what_was_changed(self):
         def of(events, kind):

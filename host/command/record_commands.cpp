@@ -14,6 +14,7 @@
 #include <cstdint>
 #include <filesystem>
 #include <iterator>
+#include <optional>
 #include <sstream>
 #include <string>
 #include <string_view>
@@ -30,6 +31,7 @@ struct Finding {
   std::string counts;   // of events and verdicts; empty if a line is wrong
   std::string missing;  // what an incomplete record lacks
   std::vector<std::string> problems;
+  std::string interrupted{};  // says that the run was interrupted; empty if it was not
 };
 
 std::string problemCount(const Finding& finding) { return countText(finding.problems.size(), "problem"); }
@@ -80,6 +82,31 @@ class VerificationProgress {
   std::chrono::steady_clock::time_point nextUpdate_ = std::chrono::steady_clock::now() + std::chrono::milliseconds(300);
 };
 
+// For example "3 verdicts (2 pass, 1 fail)".
+std::string verdictsText(const std::vector<RunEvent>& events) {
+  std::size_t all = 0;
+  std::string kinds;
+  for (const Verdict verdict : {Verdict::kPass, Verdict::kFail, Verdict::kError, Verdict::kSkip}) {
+    const auto number =
+        static_cast<std::size_t>(std::count_if(events.begin(), events.end(), [&](const RunEvent& event) {
+          const auto* const ended = std::get_if<DiagnosticEnded>(&event);
+          return ended != nullptr && ended->verdict == verdict;
+        }));
+    all += number;
+    if (number > 0) kinds += formatMessage("%@%@ %@", kinds.empty() ? "" : ", ", number, nameOf(verdict));
+  }
+  return countText(all, "verdict") + (kinds.empty() ? "" : " (" + kinds + ")");
+}
+
+// Empty if the run was not interrupted. The last event is its end.
+std::string interruptionText(const std::vector<RunEvent>& events) {
+  const std::optional<std::string>& interrupted = std::get<RunEnded>(events.back()).interrupted;
+  if (!interrupted) return {};
+  const auto* const began = std::get_if<RunStarted>(&events.front());
+  const std::string none = began != nullptr && began->ofExperiments ? "no experiment" : "no diagnostic";
+  return "the run was interrupted while " + (interrupted->empty() ? none : *interrupted) + " was running";
+}
+
 Finding verifyRecord(const std::filesystem::path& file, VerificationProgress& progress) {
   Finding finding;
   StoredRecord stored;
@@ -92,11 +119,8 @@ Finding verifyRecord(const std::filesystem::path& file, VerificationProgress& pr
   finding.problems = problemsOf(stored.events);
   const bool isComplete = std::holds_alternative<RunEnded>(stored.events.back());
   if (isComplete && stored.cutOff) finding.problems.emplace_back("an incomplete line follows the end of the run");
-  const auto verdicts =
-      static_cast<std::size_t>(std::count_if(stored.events.begin(), stored.events.end(), [](const RunEvent& event) {
-        return std::holds_alternative<DiagnosticEnded>(event);
-      }));
-  finding.counts = countText(stored.events.size(), "event") + ", " + countText(verdicts, "verdict");
+  finding.counts = countText(stored.events.size(), "event") + ", " + verdictsText(stored.events);
+  if (isComplete) finding.interrupted = interruptionText(stored.events);
   if (!isComplete) {
     finding.missing =
         stored.cutOff ? "the run did not end, and the record's last line is cut off" : "the run did not end";
@@ -120,6 +144,7 @@ ExitCode verifyOne(const std::filesystem::path& file, const Options& options, Co
   for (const std::string& problem : finding.problems) answer += "WRONG  " + printable(problem) + "\n";
   if (!finding.counts.empty()) answer += finding.counts + ", " + problemCount(finding) + "\n";
   if (!finding.missing.empty()) answer += "The record is incomplete: " + finding.missing + ".\n";
+  if (!finding.interrupted.empty()) answer += "T" + printable(finding.interrupted.substr(1)) + ".\n";
   writeOutput(options.report, console, answer);
   return finding.code;
 }
@@ -138,8 +163,9 @@ std::string lineOf(const std::filesystem::path& file, const Finding& finding, st
   line += printable(file.string()) + ": ";
   if (finding.code == ExitCode::kCannotRead) return line + printable(finding.problems.front()) + "\n";
   line += finding.counts;
-  if (!finding.problems.empty()) line += (finding.counts.empty() ? "" : ", ") + problemCount(finding);
+  line += (finding.counts.empty() ? "" : ", ") + problemCount(finding);
   if (!finding.missing.empty()) line += "; " + finding.missing;
+  if (!finding.interrupted.empty()) line += "; " + printable(finding.interrupted);
   line += "\n";
   for (const std::string& problem : finding.problems) line += "    " + printable(problem) + "\n";
   return line;

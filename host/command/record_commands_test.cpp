@@ -45,7 +45,8 @@ class RecordCommandsTest : public testing::Test {
 
 TEST_F(RecordCommandsTest, VerifyCountsWhatItHasSeen) {
   EXPECT_EQ(verify(record("a", wholeRun())), ExitCode::kAllPassed);
-  EXPECT_EQ(out_.str(), std::to_string(wholeRun().size()) + " events, 4 verdicts, 0 problems\n");
+  EXPECT_EQ(out_.str(),
+            std::to_string(wholeRun().size()) + " events, 4 verdicts (1 pass, 1 fail, 2 error), 0 problems\n");
 }
 
 TEST_F(RecordCommandsTest, VerifyTellsWhatIsWrong) {
@@ -57,7 +58,7 @@ TEST_F(RecordCommandsTest, VerifyTellsWhatIsWrong) {
             "QuazorHostErrorDomain 9 "
             "'the run was not completed'\n"
             "WRONG  A\\x0a: the recorded verdict is pass, but the results, limits and errors give error\n"
-            "4 events, 1 verdict, 2 problems\n");
+            "4 events, 1 verdict (1 pass), 2 problems\n");
 }
 
 TEST_F(RecordCommandsTest, VerifyTellsThatARunDidNotComeToItsEnd) {
@@ -76,6 +77,7 @@ TEST_F(RecordCommandsTest, VerifyTellsThatARunDidNotComeToItsEnd) {
 
 TEST_F(RecordCommandsTest, VerifyAcceptsARunThatWasInterruptedAndEnded) {
   EXPECT_EQ(verify(record("a", {runOf({"A"}), RunEnded{"", momentAt(1)}})), ExitCode::kAllPassed);
+  EXPECT_EQ(out_.str(), "2 events, 0 verdicts, 0 problems\nThe run was interrupted while no diagnostic was running.\n");
 }
 
 TEST_F(RecordCommandsTest, VerifyTellsOfALineThatIsWrong) {

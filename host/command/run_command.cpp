@@ -99,7 +99,9 @@ ExitCode perform(const Options& options, const Installation& installation, Conso
   }
   const std::vector<UserLimit> limits = began.limits;
   const bool acceptFlaky = began.acceptFlaky;
-  Conductor conductor(withoutFailed(isolationOf(options, installation), failed), runOptions, signals, events);
+  IsolationOptions isolation = withoutFailed(isolationOf(options, installation), failed);
+  isolation.onInterrupt = [&events, grace = isolation.grace](Stage stage) { events.tellInterrupt(stage, grace); };
+  Conductor conductor(std::move(isolation), runOptions, signals, events);
   events.onEvent(std::move(began));
   for (const FailedPlugin& plugin : failed) tellFailedPlugin(plugin, events);
   if (conductor.isInterrupted()) {

@@ -40,11 +40,11 @@ class ManyRecordsTest(RecordTest):
         events = len(self.lines)
         lines = self.verified(self.folder, code=66)
         self.assertEqual(lines, [
-            f"WRONG       {self.wrong}: {events} events, 1 verdict, 1 problem",
+            f"WRONG       {self.wrong}: {events} events, 1 verdict (1 fail), 1 problem",
             "    Fake.One: the recorded verdict is fail, but the results, limits and errors give pass",
-            f"OK          {self.whole}: {events} events, 1 verdict",
+            f"OK          {self.whole}: {events} events, 1 verdict (1 pass), 0 problems",
             f"UNREADABLE  {self.empty}: the record '{self.empty}' contains no events",
-            f"INCOMPLETE  {self.cut}: {events - 1} events, 1 verdict; the run did not end, and the record's last line is cut off",
+            f"INCOMPLETE  {self.cut}: {events - 1} events, 1 verdict (1 pass), 0 problems; the run did not end, and the record's last line is cut off",
             "4 records: 1 OK, 1 incomplete, 1 wrong, 1 unreadable"])
 
     def test_the_worst_counts(self):

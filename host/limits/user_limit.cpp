@@ -15,6 +15,8 @@ namespace {
 
 constexpr std::string_view kBlanks = " \t";
 constexpr std::string_view kTolerance = "+-";
+constexpr std::string_view kToleranceSign = "\xc2\xb1";  // means the same
+constexpr std::string_view kWrongTolerance = "+/-";
 // Longer operators precede their prefixes.
 constexpr std::array kOperators = {
     std::pair{std::string_view("<="), LimitOperator::kLessOrEqual},
@@ -37,10 +39,15 @@ bool looksLikeNumber(std::string_view text) {
 
 bool isReserved(char unit) { return std::string_view("<>=!:\"+").find(unit) != std::string_view::npos; }
 
+// True if a tolerance begins there, rightly written or not.
+bool beginsTolerance(std::string_view text) {
+  return text.starts_with(kTolerance) || text.starts_with(kToleranceSign) || text.starts_with(kWrongTolerance);
+}
+
 // True if an unquoted unit goes on at that place.
 bool isOfUnit(std::string_view text, std::size_t at) {
   return (kBlanks.find(text[at]) == std::string_view::npos) && (text[at] == '+' || !isReserved(text[at])) &&
-         !text.substr(at).starts_with(kTolerance);
+         !beginsTolerance(text.substr(at));
 }
 
 // Reads a limit from left to right.
@@ -122,7 +129,7 @@ class Reader {
       name = quotedName();
     } else {
       std::size_t length = 0;
-      while (length < rest_.size() && !isReserved(rest_[length]) &&
+      while (length < rest_.size() && !isReserved(rest_[length]) && !beginsTolerance(rest_.substr(length)) &&
              !(length > 0 && kBlanks.find(rest_[length - 1]) != std::string_view::npos &&
                isInterval(rest_.substr(length)))) {
         ++length;
@@ -145,7 +152,8 @@ class Reader {
 
   double number() {
     skipBlanks();
-    const std::size_t length = std::min({rest_.find_first_of(" \t,])"), rest_.find(kTolerance), rest_.size()});
+    const std::size_t length = std::min({rest_.find_first_of(" \t,])"), rest_.find(kTolerance),
+                                         rest_.find(kToleranceSign), rest_.find(kWrongTolerance), rest_.size()});
     const std::string_view text = rest_.substr(0, length);
     rest_.remove_prefix(length);
     const Value number = parseNumber(text.size() > 1 && text.front() == '+' && text[1] != '-' ? text.substr(1) : text);
@@ -163,7 +171,8 @@ class Reader {
   }
 
   double tolerance(LimitOperator comparison) {
-    if (!take(kTolerance)) return 0;
+    if (take(kWrongTolerance)) throw InputError("a tolerance is written +-, not +/-");
+    if (!take(kTolerance) && !take(kToleranceSign)) return 0;
     if (comparison != LimitOperator::kEqual) throw InputError("a tolerance needs the operator ==");
     const double tolerance = number();
     if (tolerance < 0) throw InputError("the tolerance is negative");
@@ -173,7 +182,15 @@ class Reader {
   NumberCondition comparisonWithNumber(LimitOperator comparison) {
     NumberCondition condition{comparison, number()};
     condition.unit = unit();
+    skipBlanks();
+    if (!beginsTolerance(rest_)) return condition;
     condition.tolerance = tolerance(comparison);
+    const std::optional<std::string> ofTolerance = unit();
+    if (condition.unit && ofTolerance && condition.unit != ofTolerance) {
+      throw InputError(
+          formatMessage("the number is in '%@' but its tolerance is in '%@'", *condition.unit, *ofTolerance));
+    }
+    if (ofTolerance) condition.unit = ofTolerance;
     return condition;
   }
 
@@ -210,8 +227,8 @@ std::string quotedText(const std::string& text) {
 // stand.
 std::string nameText(const std::string& name, bool mayBeNumber) {
   const bool plain = !name.empty() && trimmed(name) == name && std::none_of(name.begin(), name.end(), isReserved) &&
-                     name.find(" in") == std::string::npos && name.find("\tin") == std::string::npos &&
-                     (mayBeNumber || !looksLikeNumber(name));
+                     name.find(kToleranceSign) == std::string::npos && name.find(" in") == std::string::npos &&
+                     name.find("\tin") == std::string::npos && (mayBeNumber || !looksLikeNumber(name));
   return plain ? name : quotedText(name);
 }
 

@@ -1,11 +1,12 @@
 // User-defined limits on measured results.
 //
-//   [DIAGNOSTIC:]RESULT OP NUMBER [UNIT] [+- TOLERANCE]
+//   [DIAGNOSTIC:]RESULT OP NUMBER [UNIT] [+- TOLERANCE [UNIT]]
 //   [DIAGNOSTIC:]RESULT OP OTHER_RESULT [+- TOLERANCE]
 //   [DIAGNOSTIC:]RESULT in [LOWER, UPPER] [UNIT]
 //
-// OP is <, <=, >, >= or ==; a tolerance needs ==. An interval is open at a parenthesis. DIAGNOSTIC and RESULT may be
-// patterns (*, ?, [...]). A name in double quotes may contain any character; \" and \\ stand for " and \.
+// OP is <, <=, >, >= or ==; a tolerance needs ==. The sign ± is read as +-. Two units must agree. An interval is open
+// at a parenthesis. DIAGNOSTIC and RESULT may be patterns (*, ?, [...]). A name in double quotes may contain any
+// character; \" and \\ stand for " and \.
 #pragma once
 
 #include <optional>

@@ -34,6 +34,17 @@ TEST(UserLimit, HasACanonicalText) {
       {"A==5+-1", "A == 5 +- 1"},
       {"A == 5 ms +- 1", "A == 5 ms +- 1"},
       {"A == 5 +- 0", "A == 5"},
+      {"A == 90 +- 1 frames", "A == 90 frames +- 1"},
+      {"A == 90 frames +- 1 frames", "A == 90 frames +- 1"},
+      {"A == 5 +- 0 \"ms\"", "A == 5 ms"},
+      {"A == 5 \xc2\xb1 1", "A == 5 +- 1"},
+      {"A==5\xc2\xb1"
+       "1 ms",
+       "A == 5 ms +- 1"},
+      {"A == 5 ms\xc2\xb1 1", "A == 5 ms +- 1"},
+      {"A == B \xc2\xb1 1", "A == B +- 1"},
+      {"A > \"B \xc2\xb1 1\"", "A > \"B \xc2\xb1 1\""},
+      {"A > 5 \"+/-\"", "A > 5 \"+/-\""},
       {"BackTele.Total == BackWide.Total +- 1", "BackTele.Total == BackWide.Total +- 1"},
       {"A > B", "A > B"},
       {"Number Vok INT_SUPPLY_LATCH == 0 events", "Number Vok INT_SUPPLY_LATCH == 0 events"},
@@ -71,7 +82,13 @@ TEST(UserLimit, IsRefusedWithTheReason) {
       {"A > B +- 1", "a tolerance needs the operator =="},
       {"A == 5 +- -1", "the tolerance is negative"},
       {"A == 5 +-", "a number is missing"},
-      {"A == 5 +- 1 ms", "unexpected text 'ms' at the end"},
+      {"A == 5 s +- 1 ms", "the number is in 's' but its tolerance is in 'ms'"},
+      {"A == B +- 1 ms", "unexpected text 'ms' at the end"},
+      {"A == 5 +/- 1", "a tolerance is written +-, not +/-"},
+      {"A==5+/-1 ms", "a tolerance is written +-, not +/-"},
+      {"A == 5 ms +/- 1", "a tolerance is written +-, not +/-"},
+      {"A == B +/- 1", "a tolerance is written +-, not +/-"},
+      {"A > 5 \xc2\xb1 1", "a tolerance needs the operator =="},
       {"A in [1, 2", "a bracket is missing after the upper bound"},
       {"A in [1 2]", "a comma is missing between the two bounds"},
       {"A in [2, 1]", "no number lies between 2 and 1"},
@@ -88,7 +105,7 @@ TEST(UserLimit, IsRefusedWithTheReason) {
 
 // Draws names and units from characters that need quotation marks, and others.
 std::string randomText(std::mt19937& random, bool mayBeEmpty) {
-  constexpr std::string_view kUnits = "ab1 .*?[]in\"\\:<>=!+-,()\t\xc3\xa9";
+  constexpr std::string_view kUnits = "ab1 .*?[]in\"\\:<>=!+-,()\t/\xc3\xa9\xc2\xb1";
   std::string text;
   const std::size_t length = std::uniform_int_distribution<std::size_t>(mayBeEmpty ? 0 : 1, 6)(random);
   while (text.size() < length) text += kUnits[std::uniform_int_distribution<std::size_t>(0, kUnits.size() - 1)(random)];

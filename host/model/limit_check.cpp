@@ -112,13 +112,18 @@ std::vector<UserLimit> limitsFor(const std::string& diagnostic, const std::vecto
   return wanted;
 }
 
+std::vector<UserLimit> limitsFitting(const std::string& result, const std::vector<UserLimit>& limits) {
+  std::vector<UserLimit> fitting;
+  std::copy_if(limits.begin(), limits.end(), std::back_inserter(fitting),
+               [&result](const UserLimit& limit) { return matchesName(limit.result, result); });
+  return fitting;
+}
+
 std::vector<LimitCheck> limitChecksOf(const DiagnosticRecord& record) {
   std::vector<LimitCheck> checks;
   for (std::size_t i = 0; i < record.measuredResults.size(); ++i) {
-    for (const UserLimit& limit : record.limits) {
-      if (matchesName(limit.result, record.measuredResults[i].result.name())) {
-        checks.push_back(compared(limit, i, record.measuredResults));
-      }
+    for (const UserLimit& limit : limitsFitting(record.measuredResults[i].result.name(), record.limits)) {
+      checks.push_back(compared(limit, i, record.measuredResults));
     }
   }
   return checks;

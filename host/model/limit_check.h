@@ -35,6 +35,9 @@ bool appliesTo(const UserLimit& limit, const std::string& diagnostic);
 // The limits for this diagnostic.
 std::vector<UserLimit> limitsFor(const std::string& diagnostic, const std::vector<UserLimit>& limits);
 
+// Those of `limits` whose pattern fits the result of that name.
+std::vector<UserLimit> limitsFitting(const std::string& result, const std::vector<UserLimit>& limits);
+
 // Compares every result of the record with every one of its limits that fits it by name, in the order of the results.
 std::vector<LimitCheck> limitChecksOf(const DiagnosticRecord& record);
 

@@ -1,5 +1,6 @@
 #include "host/model/variation.h"
 
+#include "host/model/limit_check.h"
 #include "host/model/trials.h"
 
 #include <algorithm>
@@ -20,6 +21,7 @@ struct Series {
   std::string unit;
   std::vector<double> values;
   std::optional<QZLimit> limit;
+  std::vector<UserLimit> userLimits;
 };
 
 // The series of one diagnostic. A name that occurs again in an entry, or another unit, is another series.
@@ -29,10 +31,12 @@ class SeriesOfDiagnostic {
   void add(const DiagnosticRecord& record) {
     std::map<std::string, std::size_t> seen;
     if (record.experimentOnly) {
-      for (const auto& [name, measurement] : record.measurements) addValue(seen, name, measurement, std::nullopt);
+      for (const auto& [name, measurement] : record.measurements) seriesFor(seen, name, measurement);
     }
     for (const JudgedResult& one : record.measuredResults) {
-      addValue(seen, one.result.name(), one.result.measurement(), one.result.limit());
+      Series& series = seriesFor(seen, one.result.name(), one.result.measurement());
+      if (!series.limit) series.limit = one.result.limit();
+      series.userLimits = limitsFitting(one.result.name(), record.limits);
     }
   }
 
@@ -41,14 +45,14 @@ class SeriesOfDiagnostic {
  private:
   using Key = std::tuple<std::string, std::size_t, std::string>;
 
-  void addValue(std::map<std::string, std::size_t>& seen, const std::string& name, const Measurement& measurement,
-                const std::optional<QZLimit>& limit) {
+  // The series of the measurement, which is added to it.
+  Series& seriesFor(std::map<std::string, std::size_t>& seen, const std::string& name, const Measurement& measurement) {
     const std::string& unit = measurement.unit().symbol();
     const auto [place, isNew] = places_.emplace(Key{name, seen[name]++, unit}, series_.size());
-    if (isNew) series_.push_back({name, unit, {}, std::nullopt});
+    if (isNew) series_.push_back({name, unit, {}, std::nullopt, {}});
     Series& series = series_[place->second];
     series.values.push_back(measurement.value());
-    if (!series.limit) series.limit = limit;
+    return series;
   }
 
   std::map<Key, std::size_t> places_;
@@ -64,7 +68,8 @@ bool varies(const Series& series) {
 
 VaryingResult summaryOf(const Series& series) {
   constexpr double kNone = std::numeric_limits<double>::quiet_NaN();
-  VaryingResult result{series.name, series.unit, series.values.size(), kNone, kNone, kNone, series.limit};
+  VaryingResult result{series.name, series.unit, series.values.size(), kNone,
+                       kNone,       kNone,       series.limit,         series.userLimits};
   std::vector<double> finite;
   std::copy_if(series.values.begin(), series.values.end(), std::back_inserter(finite),
                [](double one) { return std::isfinite(one); });

@@ -32,7 +32,8 @@ struct VaryingResult {
   double minimum = 0;
   double median = 0;
   double maximum = 0;
-  std::optional<QZLimit> limit;  // the first that it had
+  std::optional<QZLimit> limit;       // the first that it had
+  std::vector<UserLimit> userLimits;  // those of the user that fit it
 };
 
 struct DiagnosticVariation {

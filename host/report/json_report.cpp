@@ -29,11 +29,8 @@ Json boundJson(const std::shared_ptr<const QZBound>& bound) {
 }
 
 Json checkJson(const LimitCheck& check) {
-  Json json = {{"limit", canonicalText(check.limit)},
-               {"name", check.limit.name},
-               {"severity", nameOf(check.limit.severity)},
-               {"source", check.limit.source},
-               {"verdict", check.verdictName()}};
+  Json json = userLimitJson(check.limit);
+  json["verdict"] = check.verdictName();
   if (!check.problem.empty()) json["problem"] = check.problem;
   return json;
 }
@@ -125,6 +122,13 @@ Json recordJson(const DiagnosticRecord& record, Json parameters, bool hasAnalysi
 }
 
 }  // namespace
+
+Json userLimitJson(const UserLimit& limit) {
+  return {{"limit", canonicalText(limit)},
+          {"name", limit.name},
+          {"severity", nameOf(limit.severity)},
+          {"source", limit.source}};
+}
 
 Json limitJson(const std::optional<QZLimit>& limit) {
   if (!limit) return {};

@@ -15,6 +15,8 @@ namespace quazor {
 
 // Null without a limit.
 nlohmann::ordered_json limitJson(const std::optional<QZLimit>& limit);
+// A limit of the user, with its origin.
+nlohmann::ordered_json userLimitJson(const UserLimit& limit);
 
 nlohmann::ordered_json recordJson(const DiagnosticRecord& record);
 

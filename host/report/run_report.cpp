@@ -17,7 +17,7 @@ namespace quazor {
 
 namespace {
 
-constexpr std::size_t kMaxNameInHeartbeat = 200;  // so that the line fits where it takesText()
+constexpr std::size_t kMaxNameInLine = 200;  // so that the line fits where it takesText()
 
 // Tells people who wait for a repeated run how far it is.
 std::string suffixOf(const DiagnosticStarted& diagnostic, const RunStarted& run) {
@@ -79,9 +79,25 @@ void RunReport::tell(const Heartbeat& event) {
   if (console_.showsProgress || (console_.takesText && !console_.takesText())) return;
   const auto seconds = std::chrono::duration_cast<std::chrono::seconds>(event.elapsed).count();
   console_.err << formatMessage("quazor: running %@ (%@ of %@), stage %@, for %@ s\n",
-                                shortened(printable(running_), kMaxNameInHeartbeat), number_,
+                                shortened(printable(running_), kMaxNameInLine), number_,
                                 std::max(run_.names.size(), number_), nameOf(event.stage), seconds)
                << std::flush;
+}
+
+// The teardown does not wait for the reader of that line.
+void RunReport::tellInterrupt(Stage stage, std::chrono::nanoseconds grace) {
+  if (console_.takesText && !console_.takesText()) return;
+  const std::string time = defaultText(std::chrono::duration<double>(grace).count());
+  const std::string rest =
+      stage == Stage::kTeardown
+          ? "its teardown goes on to its end"
+          : formatMessage("its %@ may take up to %@ s (--grace) to return, and then its teardown follows",
+                          nameOf(stage), time);
+  progress_.printAbove([&] {
+    console_.err << formatMessage("quazor: interrupting %@: %@; a second Ctrl-C ends it at once\n",
+                                  shortened(printable(running_), kMaxNameInLine), rest)
+                 << std::flush;
+  });
 }
 
 void RunReport::finishRun(const RunEnded& event) {

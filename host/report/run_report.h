@@ -9,6 +9,7 @@
 #include "host/report/progress.h"
 #include "host/report/report_format.h"
 
+#include <chrono>
 #include <cstddef>
 #include <functional>
 #include <optional>
@@ -51,6 +52,9 @@ class RunReport final : public RunEventSink {
   void onEvent(const RunEvent& event) override;
   // Hands over the record of the diagnostic that has ended.
   void addRecord(DiagnosticRecord record);
+
+  // Tells the user that the running diagnostic is interrupted in that stage, and how long that may take.
+  void tellInterrupt(Stage stage, std::chrono::nanoseconds grace);
 
   // The records so far.
   const std::vector<DiagnosticRecord>& records() const { return records_; }

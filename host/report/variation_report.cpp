@@ -48,10 +48,14 @@ Json countsJson(const VerdictCounts& counts) {
 void printVarying(std::ostream& out, const std::vector<VaryingResult>& results) {
   using Align = Table::Align;
   Table table({Align::kLeft, Align::kRight, Align::kRight, Align::kRight, Align::kRight, Align::kLeft, Align::kLeft});
-  table.addHeader({"Result", "Values", "Minimum", "Median", "Maximum", "Unit", "Limit"});
+  table.addHeader({"Result", "Count", "Minimum", "Median", "Maximum", "Unit", "Limit"});
   for (const VaryingResult& one : results) {
-    table.addRow({printable(one.name), std::to_string(one.values), defaultText(one.minimum), defaultText(one.median),
-                  defaultText(one.maximum), printable(one.unit), limitText(one.limit)});
+    const auto addRow = [&table, &one](const std::string& limit) {
+      table.addRow({printable(one.name), std::to_string(one.values), defaultText(one.minimum), defaultText(one.median),
+                    defaultText(one.maximum), printable(one.unit), limit});
+    };
+    addRow(limitText(one.limit));
+    for (const UserLimit& limit : one.userLimits) addRow(printable(labelOf(limit)));
   }
   table.print(out, "  ");
 }
@@ -97,6 +101,7 @@ Json variationJson(const std::vector<DiagnosticRecord>& records) {
                          {"median", numberJson(result.median)},
                          {"maximum", numberJson(result.maximum)},
                          {"limit", limitJson(result.limit)}});
+      for (const UserLimit& limit : result.userLimits) varying.back()["userLimits"].push_back(userLimitJson(limit));
     }
     json.push_back({{"name", one.name},
                     {"verdicts", countsJson(one.verdicts)},

@@ -122,6 +122,11 @@ void EventPipeline::interruptRun() {
   pass(RunEnded{running, dateNow()});
 }
 
+void EventPipeline::tellInterrupt(Stage stage, std::chrono::nanoseconds grace) {
+  const std::lock_guard lock(mutex_);
+  report_.tellInterrupt(stage, grace);
+}
+
 void EventPipeline::interruptAndLeave(const std::function<void()>& leave) {
   const std::unique_lock lock(mutex_, kMaxWaitOfInterrupt);
   if (lock.owns_lock()) interruptRun();

@@ -53,6 +53,8 @@ class EventPipeline final : public RunEventSink {
   ExitCode exitCode() const { return report_.exitCode(); }
   // Throws a CommandError (kCannotWrite) if a requested record is incomplete.
   void requireRecords() const;
+  // As in RunReport.
+  void tellInterrupt(Stage stage, std::chrono::nanoseconds grace);
   Progress& progress() { return report_.progress(); }
 
  private:

@@ -57,6 +57,7 @@ class IsolatedRun {
         deadlines_(deadlines),
         grace_(options.grace),
         heartbeat_(options.heartbeat),
+        onInterrupt_(options.onInterrupt),
         token_(std::move(token)),
         interrupted_(interrupted),
         progress_(progress),
@@ -154,7 +155,9 @@ class IsolatedRun {
       graceEnd_ = SteadyClock::now() + grace_;
       deadline_ = std::min(deadline_, graceEnd_);
     }
-    return isBeforeTeardown() || order_.stage() == Stage::kTeardown;
+    const bool mayGoOn = isBeforeTeardown() || order_.stage() == Stage::kTeardown;
+    if (mayGoOn && onInterrupt_) onInterrupt_(order_.stage());
+    return mayGoOn;
   }
 
   // After an interrupt and an early end of the child.
@@ -176,6 +179,7 @@ class IsolatedRun {
   const Deadlines& deadlines_;
   const std::chrono::nanoseconds grace_;
   const std::chrono::nanoseconds heartbeat_;
+  const std::function<void(Stage)> onInterrupt_;
   const std::string token_;
   SharedCounter& interrupted_;  // 1 after an interrupt; for the process, which may write anything to it
   Progress& progress_;

@@ -24,7 +24,8 @@ struct IsolationOptions {
   std::optional<std::uint64_t> memory;  // limit of a process's address space in bytes; nothing: the system's limit
   std::vector<DeadlineSetting> deadlines;
   std::chrono::nanoseconds grace = kDefaultGrace;
-  std::chrono::nanoseconds heartbeat{};  // the time between two Heartbeat events of a run; zero: none
+  std::chrono::nanoseconds heartbeat{};      // the time between two Heartbeat events of a run; zero: none
+  std::function<void(Stage)> onInterrupt{};  // called at the first interrupt of a stage that may go on
   bool unasked = false;  // nobody named the plug-ins: a refused one is an error of its own and stops no other
 };
 
