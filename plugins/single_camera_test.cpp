@@ -1,6 +1,7 @@
 // The registrations of the plug-in, and a run of its diagnostic on the healthy phone.
 #include "backends/simulated/simulated_phone.h"
 #include "contract/lab.h"
+#include "contract/parameter_range.h"
 #include "platform/platform.h"
 #include "tests/support/shipped_scenario.h"
 
@@ -34,6 +35,13 @@ TEST(SingleCameraPlugin, RegistersItsDiagnostic) {
   installPlatform(before);
   EXPECT_EQ(experiment->experimentDescription().parameters().size(), 4U);
   EXPECT_EQ(analysis->analysisDescription().parameters().size(), 6U);
+  const auto* const asked = dynamic_cast<const QZParameterRanges*>(experiment.get());
+  const auto* const limits = dynamic_cast<const QZParameterRanges*>(analysis.get());
+  ASSERT_TRUE(asked != nullptr && limits != nullptr);
+  EXPECT_EQ(asked->parameterRanges().find("duration")->minimum()->value, 1);
+  EXPECT_TRUE(asked->parameterRanges().find("frameRate")->minimum()->open);
+  EXPECT_TRUE(asked->parameterRanges().find("camera")->integer());
+  EXPECT_EQ(limits->parameterRanges().find("maximumJitter")->defaultValue(), 5);
   const auto measured = experiment->run(nullptr);
   ASSERT_NE(measured, nullptr);
   const auto analyzed = analysis->analyzeExperimentResult(*measured, nullptr);

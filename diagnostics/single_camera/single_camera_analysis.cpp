@@ -26,13 +26,31 @@ QZDescription QZSingleCameraAnalysis::analysisDescription() const {
   const auto add = [&](std::string_view name, std::string_view summary) {
     description.addParameter(QZNumberParameter(summary, false), name);
   };
-  add("frameRateTolerance", "How far the frame rate may be from the one asked for, in percent; default 5.");
-  add("maximumMissingFrames", "The largest number of missing frames that passes; default 0.");
-  add("maximumJitter", "The largest jitter of the time stamps that passes, in milliseconds; default 5.");
-  add("maximumErrors", "The largest growth of an error counter that passes; default 0.");
-  add("maximumSilenceAtStart", "The longest wait for the first frame that passes, in milliseconds; default 2000.");
-  add("maximumSilenceAtEnd", "The longest time without a frame at the end that passes, in milliseconds; default 500.");
+  add("frameRateTolerance", "How far the frame rate may be from the one asked for.");
+  add("maximumMissingFrames", "The largest number of missing frames that passes.");
+  add("maximumJitter", "The largest jitter of the time stamps that passes.");
+  add("maximumErrors", "The largest growth of an error counter that passes.");
+  add("maximumSilenceAtStart", "The longest wait for the first frame that passes.");
+  add("maximumSilenceAtEnd", "The longest time without a frame at the end that passes.");
   return description;
+}
+
+OrderedMap<QZParameterRange> QZSingleCameraAnalysis::parameterRanges() const {
+  OrderedMap<QZParameterRange> ranges;
+  const auto add = [&](std::string_view name, double usual, std::string_view unit) {
+    QZParameterRange range;
+    range.setMinimum(0);
+    range.setUnit(unit);
+    range.setDefault(usual);
+    ranges.set(name, range);
+  };
+  add("frameRateTolerance", frameRateTolerance_, "%");
+  add("maximumMissingFrames", maximumMissingFrames_, "frames");
+  add("maximumJitter", maximumJitter_, "ms");
+  add("maximumErrors", maximumErrors_, "errors");
+  add("maximumSilenceAtStart", maximumSilenceAtStart_, "ms");
+  add("maximumSilenceAtEnd", maximumSilenceAtEnd_, "ms");
+  return ranges;
 }
 
 bool QZSingleCameraAnalysis::setupWithParameters(const Dictionary& parameters, QZDiagnosticHost* /*host*/,

@@ -2,6 +2,7 @@
 #pragma once
 
 #include "contract/diagnostic_contract.h"
+#include "contract/parameter_range.h"
 
 #include <memory>
 
@@ -10,9 +11,10 @@ namespace quazor {
 // Reports every measurement of QZSingleCameraExperiment. All have limits except "Frames", which depends on the duration
 // only, and the frame rate that was asked for.
 // Thread: the host's, as QZAnalysis.
-class QZSingleCameraAnalysis final : public QZAnalysis, public QZAnalysisSetup {
+class QZSingleCameraAnalysis final : public QZAnalysis, public QZAnalysisSetup, public QZParameterRanges {
  public:
   QZDescription analysisDescription() const override;
+  OrderedMap<QZParameterRange> parameterRanges() const override;
   // Parameters, all optional: "frameRateTolerance" in percent of the rate that was asked for, 5;
   // "maximumMissingFrames", 0; "maximumJitter" in milliseconds, 5; "maximumErrors" of each counter, 0;
   // "maximumSilenceAtStart", 2000, and "maximumSilenceAtEnd", 500, in milliseconds. Fails with QZErrorDomain code 5 if

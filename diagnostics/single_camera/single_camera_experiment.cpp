@@ -18,7 +18,10 @@ namespace {
 
 using std::chrono::nanoseconds;
 
+constexpr double kShortestDuration = 1;      // seconds
 constexpr double kLongestDuration = 86'400;  // seconds: a day
+constexpr double kHighestFrameRate = 10'000;
+constexpr double kHighestPosition = std::numeric_limits<std::int32_t>::max();
 
 double millisecondsIn(nanoseconds time) { return std::chrono::duration<double, std::milli>(time).count(); }
 
@@ -26,9 +29,7 @@ Dictionary forPrimaryScaler(Value value) {
   return Dictionary{{std::string(capture_key::PrimaryScaler), std::move(value)}};
 }
 
-bool isWholeNumber(double number) {
-  return number >= 0 && number <= std::numeric_limits<std::int32_t>::max() && number == std::floor(number);
-}
+bool isWholeNumber(double number) { return number >= 0 && number <= kHighestPosition && number == std::floor(number); }
 
 }  // namespace
 
@@ -81,12 +82,38 @@ QZSingleCameraExperiment::QZSingleCameraExperiment(Platform platform) : platform
 
 QZDescription QZSingleCameraExperiment::experimentDescription() const {
   QZDescription description("Stream one camera and measure its frames.");
-  description.addParameter(QZNumberParameter("How long to stream, in seconds; default 3.", false), "duration");
-  description.addParameter(
-      QZNumberParameter("The position of the camera among those of the device, from 0; default 0.", false), "camera");
-  description.addParameter(QZNumberParameter("The frame rate to ask for, per second; default 30.", false), "frameRate");
-  description.addParameter(QZNumberParameter("The index of the format to ask for; default 0.", false), "formatIndex");
+  const auto add = [&](std::string_view name, std::string_view summary) {
+    description.addParameter(QZNumberParameter(summary, false), name);
+  };
+  add("duration", "How long to stream.");
+  add("camera", "The position of the camera among those of the device, from 0.");
+  add("frameRate", "The frame rate to ask for.");
+  add("formatIndex", "The index of the format to ask for.");
   return description;
+}
+
+OrderedMap<QZParameterRange> QZSingleCameraExperiment::parameterRanges() const {
+  QZParameterRange duration;
+  duration.setMinimum(kShortestDuration);
+  duration.setMaximum(kLongestDuration);
+  duration.setUnit("s");
+  duration.setDefault(duration_);
+  QZParameterRange frameRate;
+  frameRate.setMinimum(0, true);
+  frameRate.setMaximum(kHighestFrameRate);
+  frameRate.setUnit("frames/s");
+  frameRate.setDefault(frameRate_);
+  QZParameterRange position;
+  position.setMinimum(0);
+  position.setMaximum(kHighestPosition);
+  position.setInteger();
+  position.setDefault(0);
+  OrderedMap<QZParameterRange> ranges;
+  ranges.set("duration", duration);
+  ranges.set("camera", position);
+  ranges.set("frameRate", frameRate);
+  ranges.set("formatIndex", position);
+  return ranges;
 }
 
 bool QZSingleCameraExperiment::setupWithParameters(const Dictionary& parameters, QZDiagnosticHost* /*host*/,
@@ -101,11 +128,12 @@ bool QZSingleCameraExperiment::setupWithParameters(const Dictionary& parameters,
   };
   // Comparisons that NaN fails, too.
   const double duration = number("duration", duration_);
-  if (!(duration >= 1 && duration <= kLongestDuration)) {
+  if (!(duration >= kShortestDuration && duration <= kLongestDuration)) {
     return refuse("duration", "from 1 s to 86400 s", duration);
   }
   const double frameRate = number("frameRate", frameRate_);
-  if (!(frameRate > 0 && frameRate <= 10'000)) return refuse("frameRate", "above 0 and at most 10000", frameRate);
+  if (!(frameRate > 0 && frameRate <= kHighestFrameRate))
+    return refuse("frameRate", "above 0 and at most 10000", frameRate);
   const double camera = number("camera", 0);
   if (!isWholeNumber(camera)) return refuse("camera", "a whole number from 0", camera);
   const double formatIndex = number("formatIndex", 0);

@@ -2,6 +2,7 @@
 #pragma once
 
 #include "contract/diagnostic_contract.h"
+#include "contract/parameter_range.h"
 #include "platform/platform.h"
 
 #include <cstdint>
@@ -29,11 +30,12 @@ class FrameRecorder;
 // The result contains the measurements of single_camera_names.h: what the frames' time stamps say, how long the camera
 // was silent at both ends of the stream, and by how much each of the stream's error counters grew.
 // Thread: the host's, as QZExperiment; frames arrive on threads of the capture service.
-class QZSingleCameraExperiment final : public QZExperiment, public QZTeardown {
+class QZSingleCameraExperiment final : public QZExperiment, public QZTeardown, public QZParameterRanges {
  public:
   explicit QZSingleCameraExperiment(Platform platform = installedPlatform());
 
   QZDescription experimentDescription() const override;
+  OrderedMap<QZParameterRange> parameterRanges() const override;
   // Parameters, all optional: "duration" of the stream in seconds, 3; "camera", its position among the device's
   // streams, 0; "frameRate" to ask for, per second, 30; "formatIndex", 0. Fails
   // with QZErrorDomain code 5 if one is out of range.
