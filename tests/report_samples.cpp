@@ -9,7 +9,7 @@
 #include "host/model/judge.h"
 #include "host/model/limit_check.h"
 #include "host/report/report_format.h"
-#include "sample_record.h"
+#include "tests/sample_record.h"
 
 #include <algorithm>
 #include <cmath>

@@ -1,4 +1,4 @@
-#include "sample_record.h"
+#include "tests/sample_record.h"
 
 #include "host/record/record_file.h"
 
