@@ -183,10 +183,9 @@ bool QZSingleCameraExperiment::configureStream(const std::shared_ptr<FrameRecord
          "The camera does not accept %@ = %@.", key, value);
     return false;
   };
-  const Value handlers = Dictionary{
-      {std::string(capture_key::PixelBufferHandler),
-       Value(std::make_shared<PixelBufferHandler>(
-           [recorder](PixelBuffer& /*buffer*/, MediaTime presentationTime) { recorder->add(presentationTime); }))}};
+  const auto add = [recorder](PixelBuffer& /*buffer*/, MediaTime presentationTime) { recorder->add(presentationTime); };
+  Dictionary handlers;
+  handlers.set(capture_key::PixelBufferHandler, Value(std::make_shared<PixelBufferHandler>(add)));
   return set(capture_key::FormatIndex, formatIndex_) && set(capture_key::MinimumFrameRate, frameRate_) &&
          set(capture_key::MaximumFrameRate, frameRate_) &&
          set(capture_key::VideoOutputsEnabled, forPrimaryScaler(true)) &&
