@@ -66,8 +66,7 @@ class EventCountAnalysis final : public QZAnalysis, public QZAnalysisSetup, publ
  public:
   QZDescription analysisDescription() const override {
     QZDescription description("Ensure the brightness has not changed too often.");
-    description.addParameter(QZNumberParameter("The largest number of changes that passes.", false),
-                             "maximum");
+    description.addParameter(QZNumberParameter("The largest number of changes that passes.", false), "maximum");
     return description;
   }
 

@@ -182,7 +182,7 @@ fs::path Installation::namedFile(const char* kind, const fs::path& name) const {
 
 fs::path Installation::dataFile(const char* kind, const fs::path& name) const {
   if (isThere(name) || name.is_absolute()) return name;
-  const fs::path named = namedFile(kind, name);
+  fs::path named = namedFile(kind, name);
   if (!named.empty()) return named;
   const fs::path bare = name.extension() == ".json" ? fs::path(name).replace_extension() : name;
   const std::string suggestion = didYouMeanPath(bare.string(), dataNames(kind));
