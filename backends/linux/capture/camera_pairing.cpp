@@ -47,15 +47,13 @@ std::string FramePairing::whyUnpaired(const CapturedFrame& frame) const {
   if (pairing_ == MetadataPairing::kSequence) {
     return formatMessage(
         "no metadata buffer has its sequence number %@; the last one has %@. If the driver numbers both separately, "
-        "set "
-        "\"pairing\" of the binding's \"metadata\" to \"timestamp\"",
+        "set \"pairing\" of the binding's \"metadata\" to \"timestamp\"",
         frame.sequence, last_->sequence);
   }
   return formatMessage(
       "no metadata buffer has its time stamp; that of the last one differs by %@ microseconds, with the sequence "
-      "number %@ "
-      "to the frame's %@. If the driver stamps both differently, set \"pairing\" of the binding's \"metadata\" to "
-      "\"sequence\"",
+      "number %@ to the frame's %@. If the driver stamps both differently, set \"pairing\" of the binding's "
+      "\"metadata\" to \"sequence\"",
       std::chrono::duration_cast<std::chrono::microseconds>(last_->timestamp - frame.timestamp).count(),
       last_->sequence, frame.sequence);
 }

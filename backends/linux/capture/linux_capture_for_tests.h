@@ -3,6 +3,7 @@
 
 #include "backends/linux/capture/linux_capture.h"
 #include "backends/linux/system/linux_error.h"
+#include "contract/log_channel.h"
 #include "contract/message_format.h"
 #include "platform/capture_keys.h"
 #include "platform/pixel_buffer.h"
@@ -32,6 +33,23 @@ std::string outcome(Call&& call) {
   if (static_cast<bool>(call(&error))) return error == nullptr ? "done" : "done, with an error";
   return error == nullptr ? "no error" : std::to_string(error->code()) + " " + error->localizedDescription();
 }
+
+// A backend of the log that keeps the lines. Thread: any.
+class LogLines final : public LogBackend {
+ public:
+  void write(LogLevel, std::string_view, std::string_view, std::string_view text) override {
+    const std::lock_guard lock(mutex_);
+    lines_.emplace_back(text);
+  }
+  std::vector<std::string> lines() const {
+    const std::lock_guard lock(mutex_);
+    return lines_;
+  }
+
+ private:
+  mutable std::mutex mutex_;
+  std::vector<std::string> lines_;  // guarded by mutex_
+};
 
 inline std::string text(std::string_view key) { return std::string(key); }
 

@@ -16,23 +16,6 @@ using namespace std::chrono_literals;
 
 constexpr std::size_t kInfrared = 3;
 
-// Keeps the lines. Thread: any.
-class LogLines final : public LogBackend {
- public:
-  void write(LogLevel, std::string_view, std::string_view, std::string_view text) override {
-    const std::lock_guard lock(mutex_);
-    lines_.emplace_back(text);
-  }
-  std::vector<std::string> lines() const {
-    const std::lock_guard lock(mutex_);
-    return lines_;
-  }
-
- private:
-  mutable std::mutex mutex_;
-  std::vector<std::string> lines_;  // guarded by mutex_
-};
-
 TEST_F(LinuxFramesTest, AFrameCarriesItsTimeStampAndItsMetadata) {
   fake.begin(kInfrared, seen.handler());
   fake.kernel->passTime(100ms);

@@ -9,23 +9,6 @@ using namespace std::chrono_literals;
 
 constexpr std::size_t kInfrared = 3;
 
-// Thread: any.
-class ErrorLines final : public LogBackend {
- public:
-  void write(LogLevel, std::string_view, std::string_view, std::string_view text) override {
-    const std::lock_guard lock(mutex_);
-    lines_.emplace_back(text);
-  }
-  std::vector<std::string> lines() const {
-    const std::lock_guard lock(mutex_);
-    return lines_;
-  }
-
- private:
-  mutable std::mutex mutex_;
-  std::vector<std::string> lines_;  // guarded by mutex_
-};
-
 // Four frames of a camera whose metadata is stamped 3 ms later.
 std::vector<SeenFrame> framesOf(const std::string& driver, std::optional<MetadataPairing> pairing,
                                 std::vector<std::string>* lines) {
@@ -38,7 +21,7 @@ std::vector<SeenFrame> framesOf(const std::string& driver, std::optional<Metadat
     node.metadataStampedAhead = 3ms;
     return 0;
   });
-  const auto log = std::make_shared<ErrorLines>();
+  const auto log = std::make_shared<LogLines>();
   sharedLog().setBackend(log, LogLevel::kError);
   fake.begin(kInfrared, seen.handler());
   for (int i = 0; i < 6; ++i) fake.kernel->passTime(34ms);  // also what frames wait for metadata
