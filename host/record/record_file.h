@@ -14,8 +14,7 @@
 
 namespace quazor {
 
-// The version of the record format, and the first version that is still read.
-inline constexpr int kRecordFormat = 2;
+// The first version of the record format that is still read.
 inline constexpr int kFirstRecordFormat = 1;
 
 // Returns the record line of the event, including the line end. `sequence` is the number of events before it.
@@ -82,11 +81,19 @@ class RecordDefect : public CommandError {
 StoredRecord readRecord(const std::filesystem::path& file,
                         const std::function<void(std::uint64_t bytes)>& onProgress = nullptr);
 
+// The frames of a stream in one run of a diagnostic.
+struct RecordedStream {
+  std::string name;
+  std::vector<TracedFrame> frames;  // in the order of their delivery
+  std::uint64_t lost = 0;
+};
+
 // The run stored in a record. Incomplete diagnostics have the verdict kError.
 struct RecordedRun {
   RunStarted began;
   std::vector<DiagnosticRecord> records;
-  std::optional<RunEnded> ended;  // nothing: the run did not end
+  std::optional<RunEnded> ended;                       // nothing: the run did not end
+  std::vector<std::vector<RecordedStream>> streams{};  // those of each of the records
 };
 
 // The run in a record, which may be incomplete. Throws like readRecord().

@@ -110,6 +110,9 @@ class Verifier {
       wasSkipped_ = false;
     }
     if (std::holds_alternative<DiagnosticSkipped>(event)) wasSkipped_ = true;
+    if (std::holds_alternative<FramesTraced>(event) && builder_.isOpen() && builder_.record().stages.empty()) {
+      add(builder_.record().name + ": frames are recorded before its first stage");
+    }
     if (std::holds_alternative<DiagnosticEnded>(event)) checkVerdict();
   }
 
