@@ -57,6 +57,7 @@ RunStarted beginningOf(const Options& options, const Installation& installation,
   if (options.choice.attempts > 1) began.attempts = options.choice.attempts;
   if (options.choice.repetitions > 1) began.repetitions = options.choice.repetitions;
   began.acceptFlaky = options.choice.acceptFlaky;
+  began.traced = options.trace.isOn;
   began.ofExperiments = options.command == Command::kExperiment;
   for (const FailedPlugin& plugin : failed) began.names.push_back(plugin.file.filename().string());
   for (const Job& job : jobs) began.names.push_back(job.bound.described.diagnostic.name);
@@ -206,6 +207,7 @@ ExitCode runCommand(const Options& given, const Installation& installation, Cons
   RunOptions runOptions;
   runOptions.logLevel = options.logLevel.value_or(LogLevel::kDefault);
   runOptions.logLimit = options.logLimit;
+  runOptions.trace = options.trace;
   RunStarted began = beginningOf(options, installation, jobs, selection.failed);
   began.phone = phone.name;
   began.limits = std::move(selection.limits);

@@ -226,6 +226,7 @@ std::shared_ptr<CameraRun> LinuxCamera::begin(const CameraSettings& settings, Di
   plan.light = lightOf(settings.lightSource);
   plan.node = node_;
   plan.metadataNode = metadataNode_;
+  if (const auto found = cameras_->traced.find(port()); found != cameras_->traced.end()) plan.traced = found->second;
   auto begun = std::make_shared<CameraRun>(std::move(plan), cameras_->delivered);
   return begun->begin(error) ? begun : nullptr;
 }
