@@ -1,4 +1,4 @@
-// Numbers in the byte order of a protocol: USB's is little-endian, that of USB/IP big-endian.
+// Numbers of up to eight bytes in the byte order of a protocol: USB's is little-endian, that of USB/IP big-endian.
 #pragma once
 
 #include "contract/value.h"
@@ -30,6 +30,7 @@ inline std::uint64_t bigAt(std::span<const std::uint8_t> from, std::size_t offse
   return number;
 }
 
+inline void addZeros(Bytes& to, std::size_t bytes) { to.insert(to.end(), bytes, 0); }
 inline void append(Bytes& to, std::span<const std::uint8_t> more) { to.insert(to.end(), more.begin(), more.end()); }
 
 }  // namespace quazor

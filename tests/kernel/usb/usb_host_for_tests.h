@@ -20,7 +20,7 @@ inline Bytes submitBytes(const UsbipSubmit& submit) {
   addBig(bytes, submit.endpoint & 0x0FU, 4);
   addBig(bytes, 0x200, 4);  // flags
   addBig(bytes, submit.length, 4);
-  addBig(bytes, 0, 4);
+  addZeros(bytes, 4);
   addBig(bytes, submit.packets.size(), 4);
   addBig(bytes, 1, 4);
   append(bytes, Bytes{submit.setup.type, submit.setup.request});
@@ -32,7 +32,7 @@ inline Bytes submitBytes(const UsbipSubmit& submit) {
   for (const std::uint32_t length : submit.packets) {
     addBig(bytes, offset, 4);
     addBig(bytes, length, 4);
-    addBig(bytes, 0, 8);
+    addZeros(bytes, 8);
     offset += length;
   }
   return bytes;
@@ -42,7 +42,7 @@ inline Bytes unlinkBytes(const UsbipUnlink& unlink) {
   Bytes bytes;
   addBig(bytes, 2, 4);
   addBig(bytes, unlink.sequence, 4);
-  addBig(bytes, 0, 12);
+  addZeros(bytes, 12);
   addBig(bytes, unlink.unlinked, 4);
   bytes.resize(48, 0);
   return bytes;

@@ -23,7 +23,7 @@ Bytes beginReply(Command command, std::uint32_t sequence, int status) {
   reply.reserve(kHeader);
   addBig(reply, command, 4);
   addBig(reply, sequence, 4);
-  addBig(reply, 0, 12);
+  addZeros(reply, 12);
   addBig(reply, static_cast<std::uint32_t>(status), 4);
   return reply;
 }
@@ -79,9 +79,9 @@ Bytes replyTo(const UsbipSubmit& submit, int status, const TransferData& given) 
   Bytes reply = beginReply(kSubmitReply, submit.sequence, status);
   const bool isToHost = submit.isToHost();
   addBig(reply, isToHost ? given.data.size() : submit.data.size(), 4);
-  addBig(reply, 0, 4);  // the first frame
+  addZeros(reply, 4);  // the first frame
   addBig(reply, submit.packets.size(), 4);
-  addBig(reply, 0, 12);  // the number of errors, and padding
+  addZeros(reply, 12);  // the number of errors, and padding
   if (isToHost) append(reply, given.data);
   std::uint32_t offset = 0;
   for (std::size_t i = 0; i < submit.packets.size(); ++i) {
@@ -89,7 +89,7 @@ Bytes replyTo(const UsbipSubmit& submit, int status, const TransferData& given) 
     addBig(reply, offset, 4);
     addBig(reply, length, 4);
     addBig(reply, isToHost ? (i < given.packets.size() ? given.packets[i] : 0) : length, 4);
-    addBig(reply, 0, 4);  // the status
+    addZeros(reply, 4);  // the status
     offset += length;
   }
   return reply;

@@ -40,7 +40,7 @@ void addControlInterface(Bytes& to, std::size_t function) {
   Bytes units;
   Bytes camera{uvc::kInterfaceDescriptor, uvc::kInputTerminal, uvc::kCameraTerminal};
   addLittle(camera, uvc::kCamera, 2);
-  camera.insert(camera.end(), 8, 0);  // no other terminal, no name, no zoom
+  addZeros(camera, 8);  // no other terminal, no name, no zoom
   camera.push_back(3);
   addLittle(camera, UvcControls::bitsOf(uvc::kCameraTerminal), 3);
   addDescriptor(units, camera);

@@ -63,7 +63,7 @@ Bytes UvcStream::textOf(const Mode& mode) const {
   addLittle(text, mode.format + 1, 1);
   addLittle(text, mode.frame + 1, 1);
   addLittle(text, intervalOfRate(mode.rate), 4);
-  addLittle(text, 0, 10);  // no key frames, quality, window or delay
+  addZeros(text, 10);  // no key frames, quality, window or delay
   addLittle(text, bytesOf(mode), 4);
   addLittle(text, payloadSizeOf(mode), 4);
   addLittle(text, uvc::kClock, 4);
