@@ -38,6 +38,7 @@ STEPS = [
     Step("probe", "a probe lists what is there, also without rights", host.probe, boot=2),
     Step("probed_cameras", "the cameras pass as they were probed; what is not there is skipped", host.probed_cameras,
          boot=2),
+    Step("multiplanar_cameras", "the same with frames of several planes", host.multiplanar_cameras, boot=2),
     Step("projector", "frames are lit, and the light is off afterwards", cameras.projector, boot=2),
     Step("projector_unlit", "the light fails: error 206", cameras.projector_unlit, boot=2),
     Step("projector_unsafe", "the light is off for safety: error 213", cameras.projector_unsafe, boot=2),

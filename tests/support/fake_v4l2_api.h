@@ -60,6 +60,7 @@ struct FakeNode {
   std::vector<FakeFormat> formats;
   std::vector<FakeControl> controls;
   std::uint32_t mostBuffers = 32;
+  std::uint32_t planes = 2;  // of each buffer of a multi-planar node
   std::uint32_t timestampFlags = V4L2_BUF_FLAG_TIMESTAMP_MONOTONIC;
   std::uint32_t firstSequence = 0;
   std::chrono::nanoseconds stampedAhead{0};          // the difference between a frame's time stamp and its delivery
@@ -110,6 +111,7 @@ class FakeV4l2Api : public V4l2Api {
   // Called before each call of a driver, on the same thread. Set it while there are no calls.
   std::function<void(unsigned long request)> beforeCall;
   int failNextMaps = 0;              // with ENOMEM
+  int mapsBeforeFailure = 0;         // that succeed before those
   int makeEventProblem = 0;          // an error number
   int guardProblem = 0;              // an error number
   std::atomic<int> pollProblem = 0;  // an error number
@@ -157,13 +159,17 @@ class FakeV4l2Api : public V4l2Api {
   };
   struct Mapping {
     std::string path;
+    std::int64_t offset = 0;
     std::vector<std::uint8_t> memory;
   };
 
   int call(FakeNode& node, int descriptor, unsigned long request, void* argument);
   int format(FakeNode& node, bool sets, v4l2_format& format) const;
-  int requestBuffers(FakeNode& node, int descriptor, v4l2_requestbuffers& request);
-  int dequeue(FakeNode& node, v4l2_buffer& buffer);
+  static int requestBuffers(FakeNode& node, int descriptor, v4l2_requestbuffers& request);
+  static int queryBuffer(const FakeNode& node, v4l2_buffer& buffer);
+  static int queue(FakeNode& node, const v4l2_buffer& buffer);
+  static int dequeue(FakeNode& node, v4l2_buffer& buffer);
+  bool isFree(const FakeNode& node, std::int64_t offset) const;
   int enumerate(const FakeNode& node, unsigned long request, void* argument) const;
   int control(FakeNode& node, bool sets, v4l2_ext_controls& list);
   void fill(FakeNode& node, std::chrono::nanoseconds timestamp, std::uint32_t flags);
@@ -192,7 +198,14 @@ constexpr std::uint32_t fakeCode(char a, char b, char c, char d) { return v4l2_f
 
 // A camera with the formats YUYV and GREY: 640x360 at 5, 25, 30 and 40 per second, and 640x480 at up to 25.
 FakeNode fakeCamera(const std::string& bus);
+// The same with the formats NM12 and NM16, whose frames have two planes.
+FakeNode fakeMultiplanarCamera(const std::string& bus);
 // A metadata node at the same bus.
 FakeNode fakeMetadata(const std::string& bus);
+
+bool isMetadata(const FakeNode& node);
+bool isMultiplanar(const FakeNode& node);
+// V4L2_BUF_TYPE_...
+std::uint32_t bufferTypeOf(const FakeNode& node);
 
 }  // namespace quazor

@@ -82,10 +82,10 @@ bool CameraRun::prepare(DiagnosticErrorPtr* error) {
     contents_ = CameraMetadata::make(camera_.metadata, *node_, error);
     if (contents_ == nullptr) return false;
   }
-  video_ = std::make_unique<CameraBuffers>(node_, V4L2_BUF_TYPE_VIDEO_CAPTURE);
+  video_ = std::make_unique<CameraBuffers>(node_);
   if (!video_->prepare(camera_.buffers, error)) return false;
   if (metadataNode_ != nullptr) {
-    metadata_ = std::make_unique<CameraBuffers>(metadataNode_, V4L2_BUF_TYPE_META_CAPTURE);
+    metadata_ = std::make_unique<CameraBuffers>(metadataNode_);
     if (!metadata_->prepare(camera_.buffers, error) || !metadata_->streamOn(error)) return false;
   }
   return video_->streamOn(error);

@@ -59,6 +59,10 @@ class V4l2Device final {
   // The capabilities of this node, not of the whole device: V4L2_CAP_...
   std::uint32_t capabilities() const;
   VideoNodeKind kind() const;
+  // Of its buffers and formats: V4L2_BUF_TYPE_...
+  std::uint32_t bufferType() const;
+  // True if a buffer has several planes, each in memory of its own.
+  bool isMultiplanar() const { return bufferType() == V4L2_BUF_TYPE_VIDEO_CAPTURE_MPLANE; }
 
   // Locks the device for this descriptor, among all processes that use this lock; fails (kBusy) while another one holds
   // it.
