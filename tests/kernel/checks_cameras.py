@@ -164,6 +164,15 @@ def two_users(step):
     healthy_again(step)
 
 
+def media_controller(step):
+    for label in ("linked", "again"):
+        step.passed(label)
+    frames = next(result["value"] for result in step.ran("linked")["measuredResults"] if result["name"] == "Frames")
+    expect(frames > 100, f"there are only {frames} frames in 3 s")
+    for label in ("bare_before", "bare_after"):  # with its own links and formats the driver does not stream
+        print(step.ran(label))
+
+
 def projector(step):
     entry = step.passed("lit")
     expect(entry["measurements"]["FrameCount"]["value"] >= 30, "there are too few frames")

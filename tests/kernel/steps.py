@@ -16,6 +16,7 @@ class Step:
     boot: int = 1  # the boot in which it runs
     limit: int = 60  # seconds of guest time before it counts as hung
     soak: bool = False  # with sanitizers only when it is named: it takes minutes there
+    needs_vimc: bool = False
 
 
 STEPS = [
@@ -46,5 +47,7 @@ STEPS = [
     Step("sensor_30s", "60 images a second for 30 s, without loss", sensors.sensor_30s, boot=2, limit=90, soak=True),
     Step("sensor_faults", "no sensor, two, silent, refusing, removed, pausing, with long reports",
          sensors.sensor_faults, boot=2),
+    Step("media_controller", "frames of vimc come through links and pads of the binding", cameras.media_controller,
+         boot=2, needs_vimc=True),
     Step("display_off", "no images while the display is dark or unplugged", sensors.display_off, boot=2),
 ]

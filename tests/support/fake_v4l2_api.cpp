@@ -73,6 +73,7 @@ std::string FakeV4l2Api::add(int number, FakeNode node) {
     }
     std::filesystem::create_directory_symlink(device, folder / "device");
   }
+  makeDeviceFile(name, static_cast<std::uint32_t>(number));
   node.path = (roots_.dev / name).string();
   const std::lock_guard lock(mutex_);
   return nodes_.insert_or_assign(node.path, node).first->first;
@@ -200,6 +201,7 @@ void FakeV4l2Api::close(int descriptor) {
   if (events_.erase(descriptor) > 0) return;
   FakeNode& node = nodes_.at(descriptors_.at(descriptor));
   descriptors_.erase(descriptor);
+  tried_.erase(descriptor);
   if (node.lockedBy == descriptor) node.lockedBy = -1;
   if (node.owner == descriptor) {  // like the kernel; mapped buffers remain in use
     node.owner = -1;
@@ -234,8 +236,10 @@ int FakeV4l2Api::ioctl(int descriptor, unsigned long request, void* argument) {
 
 // Returns 0 or an error number.
 int FakeV4l2Api::call(FakeNode& node, int descriptor, unsigned long request, void* argument) {
+  if (node.media) return mediaCall(node, request, argument);
   switch (request) {
     case VIDIOC_QUERYCAP: {
+      if (node.isSubdevice) return ENOTTY;
       auto& capability = *static_cast<v4l2_capability*>(argument);
       copyText(capability.driver, node.driver);
       copyText(capability.card, node.card);
@@ -251,6 +255,7 @@ int FakeV4l2Api::call(FakeNode& node, int descriptor, unsigned long request, voi
     case VIDIOC_S_FMT: return format(node, request == VIDIOC_S_FMT, *static_cast<v4l2_format*>(argument));
     case VIDIOC_G_PARM:
     case VIDIOC_S_PARM: {
+      if (!node.hasIntervals) return ENOTTY;
       auto& parameters = *static_cast<v4l2_streamparm*>(argument);
       if (parameters.type != bufferTypeOf(node)) return EINVAL;
       v4l2_fract& fraction = parameters.parm.capture.timeperframe;
@@ -269,6 +274,7 @@ int FakeV4l2Api::call(FakeNode& node, int descriptor, unsigned long request, voi
     case VIDIOC_DQBUF: return dequeue(node, *static_cast<v4l2_buffer*>(argument));
     case VIDIOC_STREAMON:
       if (*static_cast<std::uint32_t*>(argument) != bufferTypeOf(node)) return EINVAL;
+      if (const int problem = streamProblem(node)) return problem;
       node.streaming = true;
       node.sequence = node.firstSequence;
       node.nextFrame = now_;
@@ -284,7 +290,9 @@ int FakeV4l2Api::call(FakeNode& node, int descriptor, unsigned long request, voi
     case VIDIOC_G_EXT_CTRLS:
     case VIDIOC_S_EXT_CTRLS:
       return control(node, request == VIDIOC_S_EXT_CTRLS, *static_cast<v4l2_ext_controls*>(argument));
-    default: return enumerate(node, request, argument);
+    default:
+      return node.isSubdevice && request != VIDIOC_QUERY_EXT_CTRL ? subdeviceCall(node, descriptor, request, argument)
+                                                                  : enumerate(node, request, argument);
   }
 }
 
@@ -312,10 +320,16 @@ int FakeV4l2Api::format(FakeNode& node, bool sets, v4l2_format& format) const {
 int FakeV4l2Api::enumerate(const FakeNode& node, unsigned long request, void* argument) const {
   if (request == VIDIOC_ENUM_FMT) {
     auto& description = *static_cast<v4l2_fmtdesc*>(argument);
-    if (description.type != bufferTypeOf(node) || description.index >= node.formats.size()) return EINVAL;
-    description.pixelformat = node.formats[description.index].fourcc;
-    copyText(description.description, node.formats[description.index].description);
-    return 0;
+    if (description.type != bufferTypeOf(node)) return EINVAL;
+    std::uint32_t left = description.index;
+    for (const FakeFormat& format : node.formats) {
+      const bool isMeant = description.mbus_code == 0 || description.mbus_code == format.busCode;
+      if (!isMeant || left-- > 0) continue;
+      description.pixelformat = format.fourcc;
+      copyText(description.description, format.description);
+      return 0;
+    }
+    return EINVAL;
   }
   if (request == VIDIOC_ENUM_FRAMESIZES) {
     auto& entry = *static_cast<v4l2_frmsizeenum*>(argument);

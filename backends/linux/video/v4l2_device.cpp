@@ -87,14 +87,17 @@ bool takes(const VideoControl& control, std::int64_t value) {
 
 ControlValue valueFor(const VideoControl& control, std::int64_t value) { return {control.id, value, is64Bit(control)}; }
 
+std::shared_ptr<V4l2Device> V4l2Device::made(std::shared_ptr<V4l2Api> kernel, const std::string& path, int descriptor,
+                                             DiagnosticErrorPtr* error) {
+  if (descriptor >= 0) return std::shared_ptr<V4l2Device>(new V4l2Device(std::move(kernel), path, descriptor));
+  failSystemCall(error, "open", path, -descriptor);
+  return nullptr;
+}
+
 std::shared_ptr<V4l2Device> V4l2Device::opened(std::shared_ptr<V4l2Api> kernel, const std::string& path, int descriptor,
                                                DiagnosticErrorPtr* error) {
-  if (descriptor < 0) {
-    failSystemCall(error, "open", path, -descriptor);
-    return nullptr;
-  }
-  std::shared_ptr<V4l2Device> node(new V4l2Device(std::move(kernel), path, descriptor));
-  return node->call(VIDIOC_QUERYCAP, "VIDIOC_QUERYCAP", &node->capability_, error) ? node : nullptr;
+  std::shared_ptr<V4l2Device> node = made(std::move(kernel), path, descriptor, error);
+  return node != nullptr && node->call(VIDIOC_QUERYCAP, "VIDIOC_QUERYCAP", &node->capability_, error) ? node : nullptr;
 }
 
 std::shared_ptr<V4l2Device> V4l2Device::open(std::shared_ptr<V4l2Api> kernel, const std::string& path,
@@ -116,6 +119,14 @@ std::shared_ptr<V4l2Device> V4l2Device::open(std::shared_ptr<V4l2Api> kernel, co
   refuseLinux(error, LinuxErrorCode::kDeviceGone, "%@ was replaced by another device before it was opened.",
               textOf(info));
   return nullptr;
+}
+
+std::shared_ptr<V4l2Device> V4l2Device::openSubdevice(std::shared_ptr<V4l2Api> kernel, const std::string& path,
+                                                      DiagnosticErrorPtr* error) {
+  const int descriptor = kernel->open(path);
+  std::shared_ptr<V4l2Device> subdevice = made(std::move(kernel), path, descriptor, error);
+  if (subdevice != nullptr) subdevice->listControls();
+  return subdevice;
 }
 
 std::shared_ptr<V4l2Device> V4l2Device::inspect(std::shared_ptr<V4l2Api> kernel, const std::string& path,
@@ -363,12 +374,15 @@ std::optional<VideoControl> V4l2Device::describe(std::uint32_t id, DiagnosticErr
   return std::nullopt;
 }
 
-const VideoControl* V4l2Device::control(std::string_view name, DiagnosticErrorPtr* error) const {
+const VideoControl* V4l2Device::findControl(std::string_view name) const {
   const auto found = std::ranges::find(controls_, name, &VideoControl::name);
   if (found != controls_.end()) return &*found;
   const std::optional<std::uint32_t> id = controlIdOf(name);
-  const VideoControl* const other = id ? controlOfId(*id) : nullptr;
-  if (other != nullptr) return other;
+  return id ? controlOfId(*id) : nullptr;
+}
+
+const VideoControl* V4l2Device::control(std::string_view name, DiagnosticErrorPtr* error) const {
+  if (const VideoControl* const found = findControl(name)) return found;
   const std::string undescribed = undescribedControls();
   refuseLinux(error, LinuxErrorCode::kNotSupported, "%@ has no control \"%@\"%@.", path_, name,
               undescribed.empty() ? "" : "; its driver does not describe the controls " + undescribed);
@@ -438,7 +452,12 @@ bool V4l2Device::call(unsigned long request, std::string_view name, void* argume
 
 // What an error number means that usually says something else.
 std::string_view V4l2Device::hintFor(int number) const {
-  if (number != ENOSPC || !fixedText(capability_.bus_info).starts_with("usb-")) return {};
+  const bool isUsb = fixedText(capability_.bus_info).starts_with("usb-");
+  if (!isUsb && (number == EPIPE || number == ENOLINK)) {
+    return "the links and pads on the camera's path do not fit together; \"media\" of the camera in the binding sets "
+           "them.";
+  }
+  if (number != ENOSPC || !isUsb) return {};
   return "the USB bus has too little bandwidth left for this stream. Use a smaller size, a lower rate, a compressed "
          "format or another bus.";
 }
