@@ -7,7 +7,6 @@
 #include <algorithm>
 #include <charconv>
 #include <fstream>
-#include <ranges>
 #include <string_view>
 #include <system_error>
 #include <utility>
@@ -128,11 +127,11 @@ MediaDevice::MediaDevice(std::shared_ptr<V4l2Api> kernel, DeviceRoots roots, std
     : kernel_(std::move(kernel)), roots_(std::move(roots)), path_(std::move(path)), descriptor_(descriptor) {}
 
 MediaDevice::~MediaDevice() {
-  for (const ChangedLink& link : std::views::reverse(changed_)) {
-    const int result = setFlags(link.before, link.before.flags);
+  for (auto link = changed_.rbegin(); link != changed_.rend(); ++link) {
+    const int result = setFlags(link->before, link->before.flags);
     if (result == 0) continue;
     DiagnosticErrorPtr error;
-    failSystemCall(&error, "setting back the link " + link.name, path_.string(), result);
+    failSystemCall(&error, "setting back the link " + link->name, path_.string(), result);
     logDefault("%@", error);
   }
   kernel_->close(descriptor_);
