@@ -82,6 +82,7 @@ std::vector<MediaDeviceInfo> mediaDevices(const std::shared_ptr<V4l2Api>& kernel
   }
   std::ranges::sort(numbered, {}, [](const auto& one) { return one.first; });
   std::vector<MediaDeviceInfo> devices;
+  devices.reserve(numbered.size());
   for (auto& [number, device] : numbered) devices.push_back(std::move(device));
   return devices;
 }
