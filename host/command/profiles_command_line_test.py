@@ -114,6 +114,27 @@ class AddedProfileTest(ProfilesCase):
         self.assertRegex(quazor("run", "--help").stdout, r"--parameters FILE\|NAME .*values and limits")
 
 
+class LimitsForOtherValuesTest(CommandLineTest):
+    REMARK = ("quazor: the limits of the profile strict.json for CameraSyncDiagnostic.* are made for duration=3, but it is "
+              "{} ({})\n")
+
+    def test_a_run_with_other_values_than_the_limits_are_made_for(self):
+        result = quazor("run", "CameraSyncDiagnostic.*", "--profile", "strict", "--set", "duration=2")
+        self.assertEqual((result.returncode, result.stderr), (1, self.REMARK.format(2, "command line")))
+        profile = self.write("longer.json", json.dumps({"schema": 1, "diagnostics": {
+            "CameraSyncDiagnostic.Back": {"experiment": {"duration": 4}}}}))
+        result = quazor("run", "--all", "--parameters", "strict", "--parameters", profile)
+        self.assertEqual((result.returncode, result.stderr), (1, self.REMARK.format(4, "profile longer.json")))
+
+    def test_nothing_is_said_where_they_fit(self):
+        for arguments in (("--all", "--profile", "strict"), ("--all", "--set", "duration=2"),
+                          ("CameraSyncDiagnostic.Back", "--profile", "strict", "--set", "duration=3.0"),
+                          ("TesselFaultDiagnostic", "--profile", "strict", "--set", "timeout=9")):
+            with self.subTest(arguments):
+                result = quazor("run", *arguments)
+                self.assertEqual((result.returncode, result.stderr), (0, ""))
+
+
 class SuggestedNamesTest(ProfilesCase):
     def test_profiles(self):
         for option in ("--profile", "--parameters"):

@@ -185,7 +185,7 @@ Selection select(const Options& options, const Installation& installation, Watch
     }
   }
   if (!selected.empty()) checkOverrides(settings, selected);
-  Selection selection{{}, std::move(scan.failed), {}};
+  Selection selection{{}, std::move(scan.failed), {}, {}};
   for (const Profile& profile : profiles) {
     selection.limits.insert(selection.limits.end(), profile.limits.begin(), profile.limits.end());
   }
@@ -193,6 +193,11 @@ Selection select(const Options& options, const Installation& installation, Watch
   for (DescribedDiagnostic& one : selected) {
     ResolvedParameters parameters = resolveParameters(one, profiles, settings);
     selection.diagnostics.push_back({std::move(one), std::move(parameters)});
+  }
+  for (const Profile& profile : profiles) {
+    for (std::string& one : limitsForOtherValues(profile, selection.diagnostics)) {
+      selection.remarks.push_back(std::move(one));
+    }
   }
   return selection;
 }
