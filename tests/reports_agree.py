@@ -230,8 +230,10 @@ class Comparison:
 
     def check_values(self, where, variation, records):
         """Compares what is said of each name that occurs once in every entry."""
+        repeated = [one for one in records
+                    if one["name"] == variation["name"] and one["repetition"] and not one["errors"]]
         entries = [one["results"] or [report_readers.Result(*each, None, "none") for each in one["measurements"]]
-                   for one in records if one["name"] == variation["name"] and one["repetition"] and not one["errors"]]
+                   for one in repeated]
         names = collections.Counter(each.name for entry in entries for each in entry)
         for one in variation["varying"]:
             values = [float(each.value) for entry in entries for each in entry if each.name == one["name"]]
@@ -242,6 +244,11 @@ class Comparison:
             got = [float(one[key]) for key in ("minimum", "median", "maximum")]
             same = all(a == b or (math.isnan(a) and math.isnan(b)) or math.isinf(b) for a, b in zip(got, expected))
             self.check(f"{where}: {one['name']}: {got} and {expected}", same, True)
+            for key in ("minimum", "maximum"):
+                first = [int(each["repetition"]) for each, entry in zip(repeated, entries) for result in entry
+                         if result.name == one["name"] and float(result.value) == float(one[key])]
+                self.check(f"{where}: {one['name']}: the first repetition with the {key}", one[f"{key}Repetition"],
+                           first[0] if first else None)
             self.kinds["a result that varied"] += 1
 
     def check_identity(self, name, run, streams, suites):

@@ -52,6 +52,9 @@ TEST(ParseOutput, TakesAFormatBeforeAColon) {
       {"json:", Format::kJson, ""},
       {"./json:report", Format::kCsv, "./json:report"},
       {":report", Format::kCsv, ":report"},
+      {":json", Format::kCsv, ":json"},
+      {"./a:json", Format::kCsv, "./a:json"},
+      {"text:a:json", Format::kText, "a:json"},
   };
   for (const Row& row : kRows) {
     const OutputRequest request = parseOutput(row.text, Format::kCsv);
