@@ -210,8 +210,7 @@ std::optional<std::string> patternNear(const std::vector<std::string>& parts, co
 
 // Suggests a result or, for a pattern or a last part alone such as "Totals", a pattern that fits several.
 std::string didYouMeanResult(const std::string& asked, const std::vector<std::string>& names) {
-  std::string suggestion = didYouMean(asked, names);
-  if (!suggestion.empty()) return suggestion;
+  if (!isPattern(asked) && nearestName(asked, names)) return didYouMean(asked, names);
   const bool isLastPart = !isPattern(asked) && asked.find('.') == std::string::npos;
   const std::vector<std::string> parts = partsOf(isLastPart ? "*." + asked : asked);
   std::vector<std::string> near;
@@ -221,7 +220,7 @@ std::string didYouMeanResult(const std::string& asked, const std::vector<std::st
   const auto nearest = std::min_element(near.begin(), near.end(), [&asked](const auto& one, const auto& other) {
     return editDistance(asked, one) < editDistance(asked, other);
   });
-  return nearest == near.end() ? suggestion : "; did you mean '" + *nearest + "'?";
+  return nearest == near.end() ? std::string() : "; did you mean '" + *nearest + "'?";
 }
 
 }  // namespace

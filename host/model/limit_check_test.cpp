@@ -259,7 +259,6 @@ TEST(LimitWithoutResult, HasAnErrorThatNamesAPatternThatIsNear) {
   EXPECT_EQ(suggestionFor("BackW*.Ofset > 0"), "");  // that would fit nothing either
   EXPECT_EQ(suggestionFor("Counts > 0"), "; did you mean 'Count'?");
   EXPECT_EQ(suggestionFor("*.*.Total > 0"), "");
-  EXPECT_EQ(suggestionFor("* > 0 W"), "");
 }
 
 TEST(LimitWithoutResult, HasAnErrorThatNamesWhatIsNear) {
