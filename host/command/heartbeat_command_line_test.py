@@ -10,10 +10,12 @@ import unittest
 from command_line_fixture import PROGRAM, RecordTest, events_in, fill, quazor
 from terminal_fixture import on_terminal
 
-SECONDS = 3
-REALTIME = ["run", "CameraSyncDiagnostic.Back", "CameraSyncDiagnostic.Front", "--realtime", "--set",
-            f"duration={SECONDS}"]
 LINE = re.compile(r"^quazor: running (\S+) \((\d+) of (\d+)\), stage (\w+), for (\d+) s$", re.MULTILINE)
+
+
+def realtime(seconds, *diagnostics):
+    """The arguments of a run of as many real seconds for each diagnostic."""
+    return ["run", *(diagnostics or ["CameraSyncDiagnostic.Back"]), "--realtime", "--set", f"duration={seconds}"]
 
 
 def beats_in(record):
@@ -22,7 +24,8 @@ def beats_in(record):
 
 class HeartbeatTest(RecordTest):
     def test_a_run_says_that_it_goes_on(self):
-        result = quazor(*REALTIME, "--heartbeat", "1", "--record", self.record)
+        result = quazor(*realtime(3, "CameraSyncDiagnostic.Back", "CameraSyncDiagnostic.Front"), "--heartbeat", "1",
+                        "--record", self.record)
         self.assertEqual(result.returncode, 0, result.stderr)
         lines = LINE.findall(result.stderr)
         self.assertGreaterEqual(len(lines), 4, result.stderr)
@@ -49,14 +52,14 @@ class HeartbeatTest(RecordTest):
     def test_the_reports_do_not_change(self):
         rows = []
         for seconds in ("1", "0"):
-            result = quazor(*REALTIME, "--heartbeat", seconds, "--format", "csv")
+            result = quazor(*realtime(2), "--heartbeat", seconds, "--format", "csv")
             self.assertEqual(result.returncode, 0, result.stderr)
             rows.append([line.split(",")[:11] for line in result.stdout.splitlines()])
         self.assertEqual(rows[0], rows[1])
-        self.assertEqual(len(rows[0]), 16)  # a header, nine results of the back cameras and six of the front ones
+        self.assertEqual(len(rows[0]), 10)  # a header and nine results
 
     def test_zero_is_off_and_a_short_run_has_none(self):
-        result = quazor(*REALTIME, "--heartbeat", "0", "--record", self.record)
+        result = quazor(*realtime(2), "--heartbeat", "0", "--record", self.record)
         self.assertEqual((result.returncode, result.stderr), (0, ""))
         self.assertEqual(beats_in(self.record), [])
         result = quazor("run", "--all", "--heartbeat", "1", "--record", self.record, "--replace")
@@ -64,11 +67,11 @@ class HeartbeatTest(RecordTest):
         self.assertEqual(beats_in(self.record), [])
 
     def test_a_terminal_has_the_progress_instead(self):
-        code, output = on_terminal(80, *REALTIME, "--heartbeat", "1", "--record", self.record)
+        code, output = on_terminal(80, *realtime(3), "--heartbeat", "1", "--record", self.record)
         self.assertEqual(code, 0, output)
         self.assertEqual(LINE.findall(output.decode()), [])
         self.assertNotIn("stage run", output.decode())
-        self.assertGreaterEqual(len(beats_in(self.record)), 4)
+        self.assertGreaterEqual(len(beats_in(self.record)), 2)
 
     def test_other_times_are_refused(self):
         for text in ("0.5", "-1", "soon", "nan", ""):
@@ -79,7 +82,7 @@ class HeartbeatTest(RecordTest):
     def test_a_standard_error_that_nobody_reads_does_not_stop_the_run(self):
         reader, writer = os.pipe()
         fill(writer)
-        process = subprocess.Popen([PROGRAM, *REALTIME, "--heartbeat", "1", "--record", self.record],
+        process = subprocess.Popen([PROGRAM, *realtime(3), "--heartbeat", "1", "--record", self.record],
                                    stdout=subprocess.PIPE, stderr=writer)
         os.close(writer)
         # Ends a run that waits for its reader, so that the test fails instead of hanging.
@@ -89,8 +92,8 @@ class HeartbeatTest(RecordTest):
         watchdog.cancel()
         os.close(reader)
         self.assertEqual(process.returncode, 0)
-        self.assertIn(b"2 passed", output)
-        self.assertGreaterEqual(len(beats_in(self.record)), 4)
+        self.assertTrue(output.startswith(b"PASS  CameraSyncDiagnostic.Back"), output)
+        self.assertGreaterEqual(len(beats_in(self.record)), 2)
 
 
 if __name__ == "__main__":
