@@ -79,8 +79,8 @@ struct Profile {
 };
 
 // Reads a profile of at most 16 MiB. Throws InputError with the file and the line if it cannot be read. Keeps mistakes
-// of the form in Profile::mistakes, so that checkProfile() can throw the one that comes first in the file. What is wrong
-// is left out of the profile.
+// of the form in Profile::mistakes, so that checkProfile() can throw the one that comes first in the file. What is
+// wrong is left out of the profile.
 Profile readProfileToCheck(const std::filesystem::path& file);
 
 // Finds the file of a profile that others are based on by its name, but none of those files; empty if there is none.

@@ -144,8 +144,9 @@ void printReport(std::ostream& out, const RunStarted& run, const DiagnosticRecor
 
 void printEnd(std::ostream& out, const RunStarted& run, const std::vector<DiagnosticRecord>& records,
               const std::optional<std::string>& interrupted, const TextContent& text, bool colour) {
-  const bool hasCounted = !text.verbose && std::any_of(records.begin(), records.end(), isOnlyCounted);
-  if (hasCounted) out << '\n';
+  const bool endsWithRepetition =
+      !records.empty() && !text.verbose && !run.ofExperiments && records.back().trial.repetition > 0;
+  if (endsWithRepetition) out << '\n';
   printVariation(out, records);
   if (records.size() != 1 || interrupted) {
     const std::size_t notReached = interrupted ? unrecordedDiagnosticsOf(run, records, interrupted).neverRun.size() : 0;

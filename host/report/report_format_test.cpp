@@ -130,7 +130,8 @@ TEST_F(ReportTextTest, SaysWhichRunItWasInEveryFormatForPrograms) {
 TEST_F(ReportTextTest, CountsOneRecordOnlyWhenTheRunWasInterrupted) {
   records_.pop_back();
   EXPECT_THAT(report(Format::kText), testing::Not(HasSubstr("1 diagnostic")));
-  EXPECT_THAT(report(Format::kText, ""), EndsWith("1 diagnostic: 1 passed, 0 failed, 0 ended in an error, 1 not reached\n"));
+  EXPECT_THAT(report(Format::kText, ""),
+              EndsWith("1 diagnostic: 1 passed, 0 failed, 0 ended in an error, 1 not reached\n"));
   EXPECT_THAT(report(Format::kText, "B"), EndsWith("an error\nInterrupted while B was running.\n"));
   EXPECT_THAT(report(Format::kText, "B\n"), EndsWith("\nInterrupted while B\\x0a was running.\n"));
   EXPECT_EQ(nlohmann::json::parse(report(Format::kJson, "B"))["interrupted"], "B");
