@@ -145,7 +145,7 @@ std::function<fs::path(const std::string& name, const std::vector<fs::path>& oth
     const {
   return [this](const std::string& name, const std::vector<fs::path>& others) -> fs::path {
     for (const fs::path& folder : dataFolders("profiles")) {
-      const fs::path file = folder / (name + ".json");
+      fs::path file = folder / (name + ".json");
       const bool isOther = std::any_of(others.begin(), others.end(), [&file](const fs::path& other) {
         std::error_code ignored;
         return fs::equivalent(file, other, ignored);

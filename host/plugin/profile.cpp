@@ -143,7 +143,7 @@ std::filesystem::path fileOfBase(const Profile& profile, const std::vector<std::
     profile.document->fail(std::string(kBase), inQuotes(profile.base) + sentence, std::string(kBase));
   };
   std::error_code ignored;
-  const std::filesystem::path beside = (profile.file.parent_path() / profile.base).lexically_normal();
+  std::filesystem::path beside = (profile.file.parent_path() / profile.base).lexically_normal();
   if (!std::filesystem::is_regular_file(beside, ignored)) {
     std::filesystem::path named = source(profile.base, read);
     if (named.empty()) fail(" is neither a file nor the name of another profile; 'quazor doctor' lists the profiles.");
