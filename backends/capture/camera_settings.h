@@ -13,7 +13,6 @@ namespace quazor {
 
 // Values are stored with the numeric type with which they were set. A user who takes control of a stream gets new
 // settings.
-// begins with new ones.
 //
 // Thread: one at a time.
 struct CameraSettings {
