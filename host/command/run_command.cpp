@@ -206,6 +206,7 @@ ExitCode runCommand(const Options& given, const Installation& installation, Cons
   RunOptions runOptions;
   runOptions.logLevel = options.logLevel.value_or(LogLevel::kDefault);
   runOptions.logLimit = options.logLimit;
+  for (const std::string& one : selection.remarks) console.err << "quazor: " << printable(one) << '\n';
   RunStarted began = beginningOf(options, installation, jobs, selection.failed);
   began.phone = phone.name;
   began.limits = std::move(selection.limits);

@@ -51,27 +51,33 @@ void leaveOut(const std::string& pattern, bool mayBeNone, std::vector<Diagnostic
   throw CommandError(ExitCode::kUsage, "--except '" + pattern + "' fits nothing of what is selected to run");
 }
 
-// Reads the profile that --profile or --parameters names. Those in the folders of profiles serve any set of plug-ins.
-Profile chosenProfile(const std::filesystem::path& name, const Installation& installation) {
+// Adds the profile in the file, after those that it is based on. Those in the folders of profiles serve any set of
+// plug-ins, and so does what they are based on.
+void addProfile(const std::filesystem::path& file, bool isNamedByPath, const Installation& installation,
+                std::vector<Profile>& profiles) {
+  for (Profile& one : readProfileAndBases(file, installation.profileSource())) {
+    one.mayNameOthers = !isNamedByPath || one.file != file;
+    profiles.push_back(std::move(one));
+  }
+}
+
+// Adds the profile that --profile or --parameters names.
+void addChosenProfile(const std::filesystem::path& name, const Installation& installation,
+                      std::vector<Profile>& profiles) {
   const std::filesystem::path file = installation.profile(name);
-  Profile profile = readProfileToCheck(file);
-  profile.mayNameOthers = file != name;
-  return profile;
+  addProfile(file, file == name, installation, profiles);
 }
 
 std::vector<Profile> profilesOf(const Options& options, const Installation& installation) {
   std::vector<Profile> profiles;
   if (!options.withoutProfile && options.profile.empty()) {
-    profiles.push_back(readProfileToCheck(installation.defaultProfile()));
-    profiles.back().mayNameOthers = true;
+    addProfile(installation.defaultProfile(), false, installation, profiles);
   }
   if (options.recorded) profiles.push_back(*options.recorded);
   if (!options.withoutProfile && !options.profile.empty()) {
-    profiles.push_back(chosenProfile(options.profile, installation));
+    addChosenProfile(options.profile, installation, profiles);
   }
-  for (const std::filesystem::path& name : options.parameterFiles) {
-    profiles.push_back(chosenProfile(name, installation));
-  }
+  for (const std::filesystem::path& name : options.parameterFiles) addChosenProfile(name, installation, profiles);
   return profiles;
 }
 
@@ -185,14 +191,16 @@ Selection select(const Options& options, const Installation& installation, Watch
     }
   }
   if (!selected.empty()) checkOverrides(settings, selected);
-  Selection selection{{}, std::move(scan.failed), {}};
-  for (const Profile& profile : profiles) {
-    selection.limits.insert(selection.limits.end(), profile.limits.begin(), profile.limits.end());
-  }
+  Selection selection{{}, std::move(scan.failed), limitsOf(profiles), {}};
   selection.limits.insert(selection.limits.end(), options.limits.begin(), options.limits.end());
   for (DescribedDiagnostic& one : selected) {
     ResolvedParameters parameters = resolveParameters(one, profiles, settings);
     selection.diagnostics.push_back({std::move(one), std::move(parameters)});
+  }
+  for (const Profile& profile : profiles) {
+    for (std::string& one : limitsForOtherValues(profile, selection.diagnostics)) {
+      selection.remarks.push_back(std::move(one));
+    }
   }
   return selection;
 }

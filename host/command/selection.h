@@ -15,6 +15,7 @@ struct Selection {
   std::vector<ResolvedDiagnostic> diagnostics;
   std::vector<FailedPlugin> failed;  // could not be loaded
   std::vector<UserLimit> limits;     // of the profiles and the command line, in this order
+  std::vector<std::string> remarks;  // sentences for a user who runs it
 };
 
 // The plug-ins that the options name, or those that are loaded by default, and the limits of their processes.

@@ -89,7 +89,7 @@ struct RecordedRun {
   std::optional<RunEnded> ended;  // nothing: the run did not end
 };
 
-// The run in a record, which may be incomplete. Throws like readRecord().
+// The run in a record, which may be incomplete. Throws like readRecord() and, for a folder, refuseFolderAsRecord().
 RecordedRun runIn(const std::filesystem::path& file);
 
 }  // namespace quazor

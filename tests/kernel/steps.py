@@ -18,6 +18,7 @@ class Step:
     limit: int = 60  # seconds of guest time before it counts as hung
     soak: bool = False  # with sanitizers only when it is named: it takes minutes there
     thorough: bool = False  # only with --thorough, or when it is named
+    needs_vimc: bool = False
 
 
 STEPS = [
@@ -40,6 +41,7 @@ STEPS = [
     Step("probe", "a probe lists what is there, also without rights", host.probe, boot=2),
     Step("probed_cameras", "the cameras pass as they were probed; what is not there is skipped", host.probed_cameras,
          boot=2),
+    Step("multiplanar_cameras", "the same with frames of several planes", host.multiplanar_cameras, boot=2),
     Step("projector", "frames are lit, and the light is off afterwards", cameras.projector, boot=2),
     Step("projector_unlit", "the light fails: error 206", cameras.projector_unlit, boot=2),
     Step("projector_unsafe", "the light is off for safety: error 213", cameras.projector_unsafe, boot=2),
@@ -48,6 +50,8 @@ STEPS = [
     Step("sensor_faults", "no sensor, two, silent, refusing, removed, pausing, with long reports",
          sensors.sensor_faults, boot=2),
     Step("usb_sensor", "a USB sensor; one that stalls, is silent, pauses, is unplugged", usb.usb_sensor, boot=2),
+    Step("media_controller", "frames of vimc come through links and pads of the binding", cameras.media_controller,
+         boot=2, needs_vimc=True),
     Step("display_off", "no images while the display is dark or unplugged", sensors.display_off, boot=2),
     Step("usb_camera", "a USB camera passes as probed; its frames are as the kernel counts them", usb.usb_camera, boot=3),
     Step("usb_cameras", "five USB cameras pass as probed, to the frame", usb.usb_cameras, boot=3),
