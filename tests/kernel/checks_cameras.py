@@ -16,6 +16,7 @@ FRONT = ("Front", "FrontInfrared")
 CAPTURE, TELEMON = "QZCapturePlugInErrorDomain", "QZTelemonErrorDomain"
 LINUX = "LinuxErrorDomain"
 SYSTEM_CALL, NO_DEVICE, BUSY, DEVICE_GONE = 1, 2, 8, 9
+SINGLE_CAMERA, NOT_STARTED = "SingleCameraErrorDomain", 5
 HOST, NO_ERROR_GIVEN = "QuazorHostErrorDomain", 1
 
 
@@ -162,6 +163,18 @@ def two_users(step):
     healthy_run(step, "first", FRONT, 3.015)
     expect_not_controlled(step, "second", BUSY, "FrontFacingCamera")
     healthy_again(step)
+
+
+def media_controller(step):
+    linked = step.passed("linked")
+    frames = next(result["value"] for result in linked["measuredResults"] if result["name"] == "Frames")
+    expect(frames >= 140, f"there are only {frames} frames in 3 s at 50 a second")
+    expect(0 <= int(step.text("buffers")) - frames <= 1, f"the kernel counted {step.text('buffers')} buffers")
+    for label in ("bare_before", "bare_after"):  # its own links and formats do not fit together, before and after
+        below = underlying(step.ended_in_error(label, SINGLE_CAMERA, NOT_STARTED))
+        expect_equal("the cause", (below["domain"], below["code"]), (LINUX, SYSTEM_CALL))
+        expect("EPIPE" in below["message"] and '"media"' in below["message"], below["message"])
+    step.passed("again")
 
 
 def projector(step):

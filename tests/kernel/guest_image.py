@@ -63,6 +63,13 @@ def system_archive(kernel):
     return archive.bytes()
 
 
+def module_archive(module):
+    """A module that a step loads itself, as bytes."""
+    archive = Archive()
+    archive.add_file(f"/rig/modules/{module.name}", module)
+    return archive.bytes()
+
+
 def project_archive(directory):
     """The project of a build as installed under /usr, the rig's own programs and the steps, as bytes."""
     archive = Archive()

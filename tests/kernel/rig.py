@@ -14,10 +14,12 @@ import threading
 import time
 
 from arrived import Arrived, CheckFailed
-from guest_image import (BuildProblem, build, plan_archive, project_archive, script_archive, system_archive)
+from guest_image import (BuildProblem, build, module_archive, plan_archive, project_archive, script_archive,
+                         system_archive)
 from kernel_package import KernelProblem, cache_directory, find_kernel
 from machine import boot, command_of
 from steps import STEPS, Step
+from vimc_module import find_vimc
 
 ROOT = pathlib.Path(__file__).resolve().parent.parent.parent
 RELEASE = ("-DCMAKE_BUILD_TYPE=Release",)
@@ -194,6 +196,8 @@ def main():
     say(f"{kernel.name}; {time.monotonic() - began:.1f} s until here")
     steps = [step for step in STEPS if not options.steps or step.name in options.steps]
     system = system_archive(kernel)
+    if any(step.needs_vimc for step in steps):
+        system += module_archive(find_vimc(kernel, say))
     plans = plans_of(steps, "boot", [system, project_archive(directory)], MEMORY, 1)
     if options.sanitized:
         long = [step.name for step in steps if step.soak and step.name not in options.steps]

@@ -16,6 +16,7 @@ class Step:
     boot: int = 1  # the boot in which it runs
     limit: int = 60  # seconds of guest time before it counts as hung
     soak: bool = False  # with sanitizers only when it is named: it takes minutes there
+    needs_vimc: bool = False
 
 
 STEPS = [
@@ -38,6 +39,7 @@ STEPS = [
     Step("probe", "a probe lists what is there, also without rights", host.probe, boot=2),
     Step("probed_cameras", "the cameras pass as they were probed; what is not there is skipped", host.probed_cameras,
          boot=2),
+    Step("multiplanar_cameras", "the same with frames of several planes", host.multiplanar_cameras, boot=2),
     Step("projector", "frames are lit, and the light is off afterwards", cameras.projector, boot=2),
     Step("projector_unlit", "the light fails: error 206", cameras.projector_unlit, boot=2),
     Step("projector_unsafe", "the light is off for safety: error 213", cameras.projector_unsafe, boot=2),
@@ -45,5 +47,7 @@ STEPS = [
     Step("sensor_30s", "60 images a second for 30 s, without loss", sensors.sensor_30s, boot=2, limit=90, soak=True),
     Step("sensor_faults", "no sensor, two, silent, refusing, removed, pausing, with long reports",
          sensors.sensor_faults, boot=2),
+    Step("media_controller", "frames of vimc come through links and pads of the binding", cameras.media_controller,
+         boot=2, needs_vimc=True),
     Step("display_off", "no images while the display is dark or unplugged", sensors.display_off, boot=2),
 ]

@@ -22,10 +22,18 @@ FakeNode webcam(int number) {
   return node;
 }
 
-class ProbedCamerasTest : public testing::Test {
+// A camera of a board: the same, but its frames have two planes.
+FakeNode boardCamera(int number) {
+  FakeNode node = webcam(number);
+  node.capabilities = V4L2_CAP_VIDEO_CAPTURE_MPLANE | V4L2_CAP_STREAMING;
+  return node;
+}
+
+// The parameter makes the node of a camera.
+class ProbedCamerasTest : public testing::TestWithParam<FakeNode (*)(int number)> {
  protected:
   ProbedCamerasTest() {
-    for (int i = 0; i < 5; ++i) kernel_->add(i, webcam(i));
+    for (int i = 0; i < 5; ++i) kernel_->add(i, GetParam()(i));
   }
 
   // A platform with the binding that the probe writes.
@@ -48,7 +56,10 @@ class ProbedCamerasTest : public testing::Test {
   const std::shared_ptr<FakeV4l2Api> kernel_ = std::make_shared<FakeV4l2Api>();
 };
 
-TEST_F(ProbedCamerasTest, TheBackCamerasRunAsTheyWereProbed) {
+INSTANTIATE_TEST_SUITE_P(Nodes, ProbedCamerasTest, testing::Values(&webcam, &boardCamera),
+                         nodesName<FakeNode (*)(int number)>);
+
+TEST_P(ProbedCamerasTest, TheBackCamerasRunAsTheyWereProbed) {
   const Outcome outcome = run({text(port_type::BackFacingCamera), text(port_type::BackFacingTelephotoCamera),
                                text(port_type::BackFacingSuperWideCamera)},
                               {16, 14, 9});
@@ -59,7 +70,7 @@ TEST_F(ProbedCamerasTest, TheBackCamerasRunAsTheyWereProbed) {
   EXPECT_TRUE(kernel_->isIdle());
 }
 
-TEST_F(ProbedCamerasTest, TheFrontCamerasRunAsTheyWereProbed) {
+TEST_P(ProbedCamerasTest, TheFrontCamerasRunAsTheyWereProbed) {
   const Outcome outcome = run({text(port_type::FrontFacingCamera), text(port_type::FrontFacingInfraredCamera)}, {1, 0});
   ASSERT_NE(outcome.result, nullptr) << outcome.error;
   for (const auto& [name, measurement] : outcome.result->measurements()) {
@@ -69,7 +80,7 @@ TEST_F(ProbedCamerasTest, TheFrontCamerasRunAsTheyWereProbed) {
   EXPECT_TRUE(kernel_->isIdle());
 }
 
-TEST_F(ProbedCamerasTest, OneCameraRunsAsItWasProbed) {
+TEST_P(ProbedCamerasTest, OneCameraRunsAsItWasProbed) {
   QZSingleCameraExperiment experiment(probedPlatform());
   const Outcome outcome = outcomeOf(experiment, Dictionary{{"duration", 2.99}});
   ASSERT_NE(outcome.result, nullptr) << outcome.error;

@@ -188,7 +188,7 @@ class CameraProbe {
       } else if (node.kind == VideoNodeKind::kMetadata) {
         tellMetadata(node);
       } else {
-        tell("    unsuitable: it does not capture video to mapped buffers, or uses several planes");
+        tell("    unsuitable: it does not capture video to mapped buffers");
       }
     }
     return std::move(cameras_);
