@@ -180,6 +180,14 @@ class LimitsForOtherValuesTest(CommandLineTest):
         result = quazor("run", "--all", "--parameters", "strict", "--parameters", profile)
         self.assertEqual((result.returncode, result.stderr), (1, self.REMARK.format(4, "profile longer.json")))
 
+    def test_an_analysis_of_such_a_run(self):
+        record = self.directory / "run.jsonl"
+        self.assertEqual(quazor("run", "CameraSyncDiagnostic.*", "--set", "duration=2", "--record", record).returncode, 0)
+        result = quazor("analyze", record, "--profile", "strict")
+        self.assertEqual((result.returncode, result.stderr), (1, self.REMARK.format(2, "command line")))
+        result = quazor("analyze", record)
+        self.assertEqual((result.returncode, result.stderr), (0, ""))
+
     def test_nothing_is_said_where_they_fit(self):
         for arguments in (("--all", "--profile", "strict"), ("--all", "--set", "duration=2"),
                           ("CameraSyncDiagnostic.Back", "--profile", "strict", "--set", "duration=3.0"),

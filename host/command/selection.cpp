@@ -6,6 +6,7 @@
 #include "host/plugin/plugin_trust.h"
 #include "host/plugin/profile.h"
 #include "host/plugin/profile_check.h"
+#include "host/text/table.h"
 
 #include <algorithm>
 #include <cstddef>
@@ -177,7 +178,7 @@ Selection select(const Options& options, const Installation& installation, Watch
   for (const DescribedDiagnostic& one : described) catalogue.push_back(one.diagnostic);
 
   const std::vector<Diagnostic> wanted = wantedOf(catalogue, options, !scan.failed.empty());
-  const std::vector<Profile> profiles = profilesOf(options, installation);
+  std::vector<Profile> profiles = profilesOf(options, installation);
   describeForProfiles(options, installation, profiles, described, signals);
   addExplainedRanges(installation.explanations(), described);
   for (const Profile& profile : profiles) checkProfile(profile, described);
@@ -197,12 +198,15 @@ Selection select(const Options& options, const Installation& installation, Watch
     ResolvedParameters parameters = resolveParameters(one, profiles, settings);
     selection.diagnostics.push_back({std::move(one), std::move(parameters)});
   }
-  for (const Profile& profile : profiles) {
-    for (std::string& one : limitsForOtherValues(profile, selection.diagnostics)) {
-      selection.remarks.push_back(std::move(one));
-    }
-  }
+  selection.profiles = std::move(profiles);
   return selection;
+}
+
+void tellLimitsForOtherValues(const std::vector<Profile>& profiles, const std::vector<ResolvedDiagnostic>& selected,
+                              std::ostream& err) {
+  for (const Profile& profile : profiles) {
+    for (const std::string& one : limitsForOtherValues(profile, selected)) err << "quazor: " << printable(one) << '\n';
+  }
 }
 
 std::string missingParameterOf(const ResolvedDiagnostic& one, const Options& options,
