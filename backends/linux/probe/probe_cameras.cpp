@@ -216,7 +216,7 @@ class CameraProbe {
     std::string reason = "its driver reports no format, or no usable size";
     if (media_.isBehindLinks(node)) {
       path = media_.pathTo(node, &reason);
-      if (path && contradicts(path->links)) {
+      if (path && contradicts(path->media.links)) {
         reason = "its links contradict those of another camera in the binding below";
         path.reset();
       }
@@ -313,8 +313,8 @@ class CameraProbe {
       if (!path->hasRate) {
         tell("    Its driver reports no frame rate. The binding says 30 a second; correct its \"interval\"s.");
       }
-      camera["media"] = path->media;
-      links_.insert(links_.end(), path->links.begin(), path->links.end());
+      camera["media"] = mediaEntry(path->media);
+      links_.insert(links_.end(), path->media.links.begin(), path->media.links.end());
     }
     cameras_[std::string(port)] = std::move(camera);
   }

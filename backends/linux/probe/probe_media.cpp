@@ -83,7 +83,8 @@ class PathPlan {
       found->format = formats.front();
       found->width = end_.width;
       found->height = end_.height;
-      found->links = links_;
+      found->media.links = links_;
+      found->media.pads = pads();
       found->hasRate = node.interval(nullptr).has_value() || setsRate(*sensor);
       found->text = text();
       return true;
@@ -91,20 +92,15 @@ class PathPlan {
     return false;
   }
 
-  Json padEntries() const {
-    Json entries = Json::array();
-    for (const auto& [place, format] : pads_) {
-      entries.push_back({{"pad", textOf(graph_.nameOf(place))},
-                         {"format", mediaBusCodeText(format.code)},
-                         {"size", {{"width", format.width}, {"height", format.height}}}});
-    }
-    return entries;
-  }
-
  private:
   static bool fail(std::string* reason, std::string text) {
     *reason = std::move(text);
     return false;
+  }
+  std::vector<PadBinding> pads() const {
+    std::vector<PadBinding> bindings;
+    for (const auto& [place, format] : pads_) bindings.push_back({graph_.nameOf(place), format, {}, {}});
+    return bindings;
   }
   std::string nameOf(PadPlace place) const { return "\"" + textOf(graph_.nameOf(place)) + "\""; }
 
@@ -205,25 +201,36 @@ std::tuple<std::ptrdiff_t, std::size_t> costOf(const Path& path) {
   return {std::ranges::count_if(path, [](const MediaLink* link) { return !link->isEnabled(); }), path.size()};
 }
 
-Json deviceEntry(const MediaDeviceInfo& info) {
-  Json entry = Json::object();
-  if (!info.driver.empty()) entry["driver"] = info.driver;
-  if (!info.model.empty()) entry["model"] = info.model;
-  if (!info.busInfo.empty()) entry["busInfo"] = info.busInfo;
-  return entry;
-}
-
-Json linkEntries(const std::vector<LinkBinding>& links) {
-  Json entries = Json::array();
-  for (const LinkBinding& link : links) {
-    Json entry = {{"source", textOf(link.source)}, {"sink", textOf(link.sink)}};
-    if (!link.enabled) entry["enabled"] = false;
-    entries.push_back(std::move(entry));
-  }
-  return entries;
+MediaDeviceMatch matchOf(const MediaDeviceInfo& info) {
+  const auto textIn = [](const std::string& text) { return text.empty() ? std::nullopt : std::optional(text); };
+  return {textIn(info.driver), textIn(info.model), textIn(info.busInfo)};
 }
 
 }  // namespace
+
+Json mediaEntry(const MediaBinding& media) {
+  Json device = Json::object();
+  if (media.device.driver) device["driver"] = *media.device.driver;
+  if (media.device.model) device["model"] = *media.device.model;
+  if (media.device.busInfo) device["busInfo"] = *media.device.busInfo;
+  Json links = Json::array();
+  for (const LinkBinding& link : media.links) {
+    Json entry = {{"source", textOf(link.source)}, {"sink", textOf(link.sink)}};
+    if (!link.enabled) entry["enabled"] = false;
+    links.push_back(std::move(entry));
+  }
+  Json pads = Json::array();
+  for (const PadBinding& pad : media.pads) {
+    if (!pad.format) continue;
+    pads.push_back({{"pad", textOf(pad.pad)},
+                    {"format", mediaBusCodeText(pad.format->code)},
+                    {"size", {{"width", pad.format->width}, {"height", pad.format->height}}}});
+  }
+  Json entry = {{"device", std::move(device)}};
+  if (!links.empty()) entry["links"] = std::move(links);
+  entry["pads"] = std::move(pads);
+  return entry;
+}
 
 MediaProbe::MediaProbe(std::shared_ptr<V4l2Api> kernel, const DeviceRoots& roots) : kernel_(std::move(kernel)) {
   for (const MediaDeviceInfo& info : mediaDevices(kernel_, roots)) {
@@ -262,9 +269,7 @@ std::optional<ProbedPath> MediaProbe::pathTo(const V4l2DeviceInfo& node, std::st
     PathPlan plan(kernel_, graph, path);
     ProbedPath found;
     if (opened == nullptr || !plan.make(*opened, &found, reason)) continue;
-    found.media = {{"device", deviceEntry(controller.info)}};
-    if (!found.links.empty()) found.media["links"] = linkEntries(found.links);
-    found.media["pads"] = plan.padEntries();
+    found.media.device = matchOf(controller.info);
     return found;
   }
   return std::nullopt;

@@ -15,14 +15,16 @@ namespace quazor {
 
 // A path from a sensor to a video node.
 struct ProbedPath {
-  std::string text;                // user-readable: its entities
-  std::vector<LinkBinding> links;  // to set for it
-  nlohmann::ordered_json media;    // the binding's "media"
-  std::uint32_t width = 0;         // of the frames at the video node
+  std::string text;         // user-readable: its entities
+  MediaBinding media;       // links and pads to set
+  std::uint32_t width = 0;  // of the frames at the video node
   std::uint32_t height = 0;
   VideoFormat format;    // of the video node
   bool hasRate = false;  // the node's intervals or the sensor's blanking set the rate
 };
+
+// The entry "media" of a camera in a binding.
+nlohmann::ordered_json mediaEntry(const MediaBinding& media);
 
 // The media controllers of a machine. Nothing is changed: formats are only tried.
 //
