@@ -61,13 +61,14 @@ def healthy_again(step):
     healthy_run(step, "next", FRONT, 2.015)
 
 
-def as_the_kernel_counts(step, label, cameras):
-    """Checks that the counts of every camera equal the number of buffers dequeued until they were read."""
+def as_the_kernel_counts(step, label, cameras, ports=PORTS):
+    """Checks that the counts of every camera equal the number of buffers dequeued until they were read. `ports` has
+    the bus info of each camera."""
     entry = healthy_run(step, label, cameras, 3.015)
     trace = read_trace(step.text(f"{label}.trace"))
     minors = dict(line.split() for line in step.text(f"{label}.minors").splitlines())
     moment = trace.end_of_silence()
-    buffers = {camera: trace.dequeued_before(int(minors[PORTS[camera]]), moment) for camera in cameras}
+    buffers = {camera: trace.dequeued_before(int(minors[ports[camera]]), moment) for camera in cameras}
     master = buffers[cameras[0]][0].timestamp
     for camera in cameras:
         expect_equal(f"the frame count of {camera}", frames_of(entry, camera), len(buffers[camera]))
