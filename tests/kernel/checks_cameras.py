@@ -176,6 +176,12 @@ def media_controller(step):
         expect_equal("the cause", (below["domain"], below["code"]), (LINUX, SYSTEM_CALL))
         expect("EPIPE" in below["message"] and '"media"' in below["message"], below["message"])
     step.passed("again")
+    for way in ('"Sensor A"', '"Sensor B"', '"RGB/YUV Input", "Scaler"'):
+        expect(f"through a media controller, from {way};" in step.out("probe"), f"the probe finds no way from {way}")
+    as_probed = step.ran("as_probed")
+    expect(as_probed["error"] is None, f"what was probed does not run: {as_probed['error']}")
+    for camera in range(3):
+        step.passed(f"probed_{camera}")
 
 
 def projector(step):

@@ -7,6 +7,7 @@
 #include <cstring>
 #include <fstream>
 #include <iomanip>
+#include <stdexcept>
 #include <utility>
 
 namespace quazor {
@@ -52,7 +53,7 @@ class FakeV4l2Api::Guard final : public ControlGuard {
 
 FakeV4l2Api::FakeV4l2Api() {
   std::string folder = (std::filesystem::temp_directory_path() / "fake-video-XXXXXX").string();
-  ::mkdtemp(folder.data());
+  if (::mkdtemp(folder.data()) == nullptr) throw std::runtime_error("no directory for the fake kernel");
   roots_ = {std::filesystem::path(folder) / "sys", std::filesystem::path(folder) / "dev"};
 }
 

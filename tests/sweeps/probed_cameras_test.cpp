@@ -1,5 +1,6 @@
 // The camera experiments with the binding that the probe writes, on cameras whose formats differ from each other.
 #include "backends/linux/counters/counter_system_for_tests.h"
+#include "backends/linux/media/media_for_tests.h"
 #include "backends/linux/probe/probe.h"
 #include "diagnostics/single_camera/single_camera_experiment.h"
 #include "tests/sweeps/linux_cameras.h"
@@ -29,6 +30,17 @@ FakeNode boardCamera(int number) {
   return node;
 }
 
+// A platform with the binding that the probe writes.
+Platform platformOf(const std::shared_ptr<FakeV4l2Api>& kernel) {
+  const std::filesystem::path file = kernel->roots().sysfs.parent_path() / "binding.json";
+  std::ofstream(file) << probeMachine({kernel, kernel->roots(), {}, std::make_shared<FakeCounters>(), file}).binding;
+  Platform platform;
+  platform.capture = makeLinuxCapture(readBinding(file), kernel, kernel->roots());
+  platform.clock = std::make_shared<FakeClock>(kernel);
+  platform.concurrency = std::make_shared<ThreadConcurrency>();
+  return platform;
+}
+
 // The parameter makes the node of a camera.
 class ProbedCamerasTest : public testing::TestWithParam<FakeNode (*)(int number)> {
  protected:
@@ -36,17 +48,7 @@ class ProbedCamerasTest : public testing::TestWithParam<FakeNode (*)(int number)
     for (int i = 0; i < 5; ++i) kernel_->add(i, GetParam()(i));
   }
 
-  // A platform with the binding that the probe writes.
-  Platform probedPlatform() {
-    const std::filesystem::path file = kernel_->roots().sysfs.parent_path() / "binding.json";
-    std::ofstream(file)
-        << probeMachine({kernel_, kernel_->roots(), {}, std::make_shared<FakeCounters>(), file}).binding;
-    Platform platform;
-    platform.capture = makeLinuxCapture(readBinding(file), kernel_, kernel_->roots());
-    platform.clock = std::make_shared<FakeClock>(kernel_);
-    platform.concurrency = std::make_shared<ThreadConcurrency>();
-    return platform;
-  }
+  Platform probedPlatform() { return platformOf(kernel_); }
 
   Outcome run(const std::vector<std::string>& ports, Array formats) {
     QZCameraSyncExperiment experiment(ports, std::move(formats), 30, probedPlatform());
@@ -90,6 +92,21 @@ TEST_P(ProbedCamerasTest, OneCameraRunsAsItWasProbed) {
   EXPECT_LT(outcome.measured("SilenceAtEnd"), 40);
   EXPECT_TRUE(experiment.teardown(nullptr));
   EXPECT_TRUE(kernel_->isIdle());
+}
+
+TEST(ProbedBoardTest, ACameraBehindAMediaControllerRunsAsItWasProbed) {
+  const FakeBoard board;
+  const std::vector<FakeLink> before = board.links();
+  board.kernel->with(board.camera, [](FakeNode& node) { return node.interval = {1, 30}; });
+  {
+    QZSingleCameraExperiment experiment(platformOf(board.kernel));
+    const Outcome outcome = outcomeOf(experiment, Dictionary{{"duration", 2.99}});
+    ASSERT_NE(outcome.result, nullptr) << outcome.error;
+    EXPECT_EQ(outcome.measured("Frames"), 90);
+    EXPECT_TRUE(experiment.teardown(nullptr));
+  }
+  EXPECT_EQ(board.links(), before);
+  EXPECT_TRUE(board.kernel->isIdle());
 }
 
 }  // namespace

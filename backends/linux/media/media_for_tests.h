@@ -32,6 +32,9 @@ class FakeBoard {
     FakeNode node = fakeCamera("platform:fake-isp");
     node.hasIntervals = false;
     node.formats.erase(node.formats.begin());
+    node.formats[0].busCode = MEDIA_BUS_FMT_Y8_1X8;
+    node.formats.push_back(
+        {fakeCode('R', 'G', 'B', '3'), "24-bit RGB", node.formats[0].sizes, MEDIA_BUS_FMT_RGB888_1X24});
     camera = kernel->add(0, node);
     for (const char* name : {"A", "B"}) sensors.push_back(kernel->addSubdevice(name[0] - 'A', sensor(name)));
     FakeNode lamp;

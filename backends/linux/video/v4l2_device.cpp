@@ -169,13 +169,14 @@ bool V4l2Device::lockExclusive(DiagnosticErrorPtr* error) {
   return false;
 }
 
-std::vector<VideoFormat> V4l2Device::formats() const {
+std::vector<VideoFormat> V4l2Device::formats(std::uint32_t mediaBusCode) const {
   std::vector<VideoFormat> formats;
   const bool isCamera = kind() == VideoNodeKind::kCamera;
   for (std::uint32_t index = 0; index < kMaxItems; ++index) {
     v4l2_fmtdesc description{};
     description.index = index;
     description.type = bufferType();
+    description.mbus_code = mediaBusCode;
     if (call(VIDIOC_ENUM_FMT, &description) != 0) break;
     VideoFormat format{index, fourccText(description.pixelformat), fixedText(description.description), {}};
     if (isCamera) format.sizes = sizesOf(description.pixelformat);

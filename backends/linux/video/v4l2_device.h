@@ -71,8 +71,9 @@ class V4l2Device final {
   // it.
   bool lockExclusive(DiagnosticErrorPtr* error);
 
-  // The formats in the driver's order, with their known sizes and intervals.
-  std::vector<VideoFormat> formats() const;
+  // The formats in the driver's order, with their known sizes and intervals. With the code of a media bus format, only
+  // those that frames of it can have.
+  std::vector<VideoFormat> formats(std::uint32_t mediaBusCode = 0) const;
   // Sets the format and frame size. Fails (kNotSupported), without changing anything, if the driver has no such format
   // or would use another size.
   bool setFormat(const VideoMode& mode, DiagnosticErrorPtr* error);
