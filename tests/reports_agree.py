@@ -66,12 +66,14 @@ def outcome_of(record):
     return "flaky" if record["verdict"] == "pass" and (record["attempt"] or 1) > 1 else record["verdict"]
 
 
-def counts_line(records, of_experiments):
+def counts_line(records, of_experiments, never_began):
     ended = last_attempts(records)
     count = collections.Counter(outcome_of(one) for one in ended)
     many = "" if len(ended) == 1 else "s"
     noun = "run" if any(one["repetition"] for one in records) else "experiment" if of_experiments else "diagnostic"
     more = "".join(f", {count[key]} {word}" for key, word in (("skip", "skipped"), ("flaky", "flaky")) if count[key])
+    if never_began:
+        more += f", {never_began} not reached"
     if warnings := report_limits.warnings_in(records):
         more += f", {warnings} warning{'' if warnings == 1 else 's'}"
     if of_experiments:
@@ -114,10 +116,10 @@ def failure_lines(records):
         yield text + (f" ({times} times, first in {trial})" if times > 1 else f" ({trial})" if trial else "")
 
 
-def text_end(records, of_experiments, interrupted, run):
+def text_end(records, of_experiments, interrupted, run, never_began):
     """The lines after the records of a text and after the table of what varied."""
     if len(records) != 1 or interrupted is not None:
-        yield counts_line(records, of_experiments)
+        yield counts_line(records, of_experiments, never_began)
     if any(outcome_of(one) == "flaky" for one in last_attempts(records)) and not run.get("acceptFlaky"):
         yield "A pass after an error counts as an error, unless --accept-flaky is given."
     if not of_experiments:
@@ -186,7 +188,10 @@ class Comparison:
         self.check_identity(name, identity, streams, suites)
         rows = self.without_identity(name, report_readers.csv_rows(reports["csv"]), identity)
         self.compare_csv(name, rows, of_experiments, records)
-        self.compare_text(name, report_readers.Lines(reports["text"]), of_experiments, records, interrupted, run)
+        never_began = sum(one.end["status"] == "SKIP" for one in streams[len(records):])
+        end = list(text_end(records, of_experiments, interrupted, run, never_began))
+        varies = any(one["varying"] for one in json.loads(reports["json"]).get("variation", []))
+        self.compare_text(name, report_readers.Lines(reports["text"]), of_experiments, records, varies, end)
 
     @staticmethod
     def is_superseded(records, place):
@@ -230,8 +235,10 @@ class Comparison:
 
     def check_values(self, where, variation, records):
         """Compares what is said of each name that occurs once in every entry."""
+        repeated = [one for one in records
+                    if one["name"] == variation["name"] and one["repetition"] and not one["errors"]]
         entries = [one["results"] or [report_readers.Result(*each, None, "none") for each in one["measurements"]]
-                   for one in records if one["name"] == variation["name"] and one["repetition"] and not one["errors"]]
+                   for one in repeated]
         names = collections.Counter(each.name for entry in entries for each in entry)
         for one in variation["varying"]:
             values = [float(each.value) for entry in entries for each in entry if each.name == one["name"]]
@@ -242,6 +249,11 @@ class Comparison:
             got = [float(one[key]) for key in ("minimum", "median", "maximum")]
             same = all(a == b or (math.isnan(a) and math.isnan(b)) or math.isinf(b) for a, b in zip(got, expected))
             self.check(f"{where}: {one['name']}: {got} and {expected}", same, True)
+            for key in ("minimum", "maximum"):
+                first = [int(each["repetition"]) for each, entry in zip(repeated, entries) for result in entry
+                         if result.name == one["name"] and float(result.value) == float(one[key])]
+                self.check(f"{where}: {one['name']}: the first repetition with the {key}", one[f"{key}Repetition"],
+                           first[0] if first else None)
             self.kinds["a result that varied"] += 1
 
     def check_identity(self, name, run, streams, suites):
@@ -314,16 +326,16 @@ class Comparison:
             self.check_record(f"{name} {place} record", blurred(record_reader.shown(one)),
                               blurred(record_reader.expected(record)))
 
-    def compare_text(self, name, lines, of_experiments, records, interrupted, run):
+    def compare_text(self, name, lines, of_experiments, records, varies, end):
         for place, record in enumerate(records):
             expected = report_readers.expected_of_text(record, of_experiments)
             got = report_readers.read_text(lines, expected)
             self.check_record(f"{name} {place} text", blurred(got), blurred(expected))
         if any(one["repetition"] for one in records):
-            self.check(f"{name} text: variation", lines.block()[0], b"What varied between the repetitions:")
+            title = b"What varied between the repetitions" + b" (#: the first repetition with that value)" * varies + b":"
+            self.check(f"{name} text: variation", lines.block()[0], title)
         left = [line.decode("utf-8", "replace") for line in lines.rest()]
-        expected = [*text_end(records, of_experiments, interrupted, run), ""]
-        self.check(f"{name} text: end", blurred(left), blurred(expected))
+        self.check(f"{name} text: end", blurred(left), blurred([*end, ""]))
 
     def count_kinds(self, of_experiments, records):
         for record in records:

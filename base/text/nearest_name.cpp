@@ -1,6 +1,7 @@
 #include "base/text/nearest_name.h"
 
 #include <algorithm>
+#include <iterator>
 
 namespace quazor {
 
@@ -40,6 +41,14 @@ std::optional<std::string> nearestName(std::string_view name, const std::vector<
 std::string didYouMean(std::string_view name, const std::vector<std::string>& candidates) {
   const std::optional<std::string> nearest = nearestName(name, candidates);
   return nearest ? "; did you mean '" + *nearest + "'?" : std::string();
+}
+
+std::string didYouMeanOrPattern(std::string_view name, const std::vector<std::string>& candidates) {
+  std::vector<std::string> longer;
+  std::copy_if(candidates.begin(), candidates.end(), std::back_inserter(longer),
+               [name](const std::string& one) { return !name.empty() && one.starts_with(name); });
+  if (longer.empty()) return didYouMean(name, candidates);
+  return "; did you mean '" + (longer.size() == 1 ? longer.front() : std::string(name) + "*") + "'?";
 }
 
 std::string didYouMeanPath(std::string_view name, const std::vector<std::string>& candidates) {

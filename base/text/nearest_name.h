@@ -20,6 +20,10 @@ std::optional<std::string> nearestName(std::string_view name, const std::vector<
 // "; did you mean 'NAME'?", or an empty text if no candidate is near: the end of an error message.
 std::string didYouMean(std::string_view name, const std::vector<std::string>& candidates);
 
+// Like didYouMean(), but the beginning of one candidate stands for that, and the beginning of several for the pattern
+// NAME* that fits them.
+std::string didYouMeanOrPattern(std::string_view name, const std::vector<std::string>& candidates);
+
 // Like didYouMean(), for candidates in folders, such as "camera_sync/start_refused": a name without its folder stands
 // for all candidates with that last part, and a misspelt one for those with the nearest last part.
 std::string didYouMeanPath(std::string_view name, const std::vector<std::string>& candidates);

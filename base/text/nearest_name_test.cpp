@@ -53,6 +53,15 @@ TEST(DidYouMean, EndsASentenceOrSaysNothing) {
   EXPECT_EQ(didYouMean("x", {"timeout", "duration"}), "");
 }
 
+TEST(DidYouMean, SuggestsAPatternForTheBeginningOfSeveral) {
+  const std::vector<std::string> names = {"CameraSync.Back", "CameraSync.Front", "Tessel"};
+  EXPECT_EQ(didYouMeanOrPattern("Camera", names), "; did you mean 'Camera*'?");
+  EXPECT_EQ(didYouMeanOrPattern("CameraSync.F", names), "; did you mean 'CameraSync.Front'?");
+  EXPECT_EQ(didYouMeanOrPattern("CameraSync.Bakc", names), "; did you mean 'CameraSync.Back'?");
+  EXPECT_EQ(didYouMeanOrPattern("x", names), "");
+  EXPECT_EQ(didYouMeanOrPattern("", names), "");
+}
+
 TEST(NearestName, MayLackItsFolder) {
   const std::vector<std::string> names = {"a/device_missing", "b/device_missing", "b/frames_dropped", "healthy"};
   EXPECT_EQ(didYouMeanPath("frames_dropped", names), "; did you mean 'b/frames_dropped'?");

@@ -63,7 +63,8 @@ void addChoiceOptions(CLI::App& command, ChoiceTexts& texts, const std::string& 
                    "With --attempts: exit with 0 if some of the " + what + " passed only after an error");
   command
       .add_option("--repeat", texts.repetitions,
-                  "Run all selected " + what + " this many times, one round after the other, and show what varied")
+                  "Run all selected " + what +
+                      " this many times, one round after the other, and show what did not pass and what varied")
       ->type_name("N");
 }
 

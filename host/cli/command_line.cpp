@@ -153,8 +153,8 @@ void addParameterOptions(CLI::App& command, RawOptions& raw) {
   command
       .add_option(
           "--profile", raw.profile,
-          "Read parameter values and limits from this file or installed profile, for example strict, instead of the "
-          "default profile; 'none' skips it")
+          "Read parameter values and limits from this file or installed profile, for example strict (for 3 s), instead "
+          "of the default profile; 'none' skips it")
       ->type_name("FILE|NAME");
   addRepeatable(
       command, "--parameters", raw.parameterFiles,
@@ -233,7 +233,6 @@ Command commandOf(const std::string& name) {
   return static_cast<Command>(found - std::begin(kCommandNames));
 }
 
-// Only commands that run or analyze write reports in several formats.
 ReportOptions reportOf(const RawOptions& raw, bool isOfRun) {
   ReportOptions report;
   report.format = *formatNamed(raw.format);
@@ -303,9 +302,7 @@ Options optionsOf(const CLI::App& command, const RawOptions& raw) {
   if (command.get_option_no_throw("--trace") != nullptr) options.trace = traceOf(raw.trace);
   options.systemLog = raw.systemLog;
   if (command.get_option_no_throw("--tag") != nullptr) options.tags = tagsOf(raw.tags);
-  const bool isOfRun = options.command == Command::kRun || options.command == Command::kExperiment ||
-                       options.command == Command::kAnalyze;
-  options.report = reportOf(raw, isOfRun);
+  options.report = reportOf(raw, writesSeveralFormats(options.command));
   options.report.exitRules.allowSkips = options.choice.allowSkips;
   options.report.text.verbose = raw.verbose;
   options.report.shownLog = options.logLevel.value_or(LogLevel::kError);
@@ -480,7 +477,9 @@ std::optional<Options> parseCommandLine(const std::vector<std::string>& given, s
     app.parse(std::move(texts));
     removeMarks(raw);
     *code = ExitCode::kAllPassed;
-    return optionsOf(*app.get_subcommands().front(), raw);
+    Options options = optionsOf(*app.get_subcommands().front(), raw);
+    warnOfSuffixes(options, err);
+    return options;
   } catch (const CLI::Success& answer) {
     app.exit(answer, out, err);
     *code = ExitCode::kAllPassed;

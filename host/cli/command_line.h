@@ -83,6 +83,11 @@ struct Options {
   bool inProcess = false;
 };
 
+// Only commands that run or analyze write several reports, each in one of all formats.
+constexpr bool writesSeveralFormats(Command command) {
+  return command == Command::kRun || command == Command::kExperiment || command == Command::kAnalyze;
+}
+
 struct OptionSummary {
   std::string name;  // as in "--set"
   bool takesValue = false;

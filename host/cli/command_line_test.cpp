@@ -291,7 +291,7 @@ TEST(ParseCommandLine, RefusesWrongUsage) {
       {{"run", "A", "--trace", "frames=-1"}, "--trace: N '-1': expected an integer"},
       {{"run", "A", "--trace", "frames="}, "--trace: N '': expected an integer"},
       {{"run", "A", "--trace", ""}, "--trace: the value is empty"},
-      {{"analyze", "r", "--trace", "off"}, "--trace"},
+      {{"analyze", "r", "--trace=off"}, "--trace"},
       {{"run", "A", "--deadline", "soon"}, "--deadline 'soon': 'soon' is not a number"},
       {{"run", "A", "--deadline", "runn=5"}, "unknown stage 'runn'"},
       {{"run", "--only", "passed"}, "--only: passed not in {failed}"},

@@ -141,6 +141,21 @@ fs::path Installation::profile(const fs::path& name) const { return dataFile("pr
 
 fs::path Installation::namedProfile(const std::string& name) const { return namedFile("profiles", name); }
 
+std::function<fs::path(const std::string& name, const std::vector<fs::path>& others)> Installation::profileSource()
+    const {
+  return [this](const std::string& name, const std::vector<fs::path>& others) -> fs::path {
+    for (const fs::path& folder : dataFolders("profiles")) {
+      fs::path file = folder / (name + ".json");
+      const bool isOther = std::any_of(others.begin(), others.end(), [&file](const fs::path& other) {
+        std::error_code ignored;
+        return fs::equivalent(file, other, ignored);
+      });
+      if (isThere(file) && !isOther) return file;
+    }
+    return {};
+  };
+}
+
 std::vector<std::string> Installation::profileNames() const { return dataNames("profiles"); }
 
 fs::path Installation::defaultScenario() const { return data_ / "scenarios" / "healthy.json"; }

@@ -55,6 +55,10 @@ class Installation {
   std::filesystem::path profile(const std::filesystem::path& name) const;
   // The profile of that name in the folders above; empty if there is none.
   std::filesystem::path namedProfile(const std::string& name) const;
+  // The profile of that name in the folders above, but none of those others, so that a profile can be based on the
+  // installed one that it hides; empty if there is none. The function refers to this object.
+  std::function<std::filesystem::path(const std::string& name, const std::vector<std::filesystem::path>& others)>
+  profileSource() const;
   std::vector<std::string> profileNames() const;
   std::filesystem::path defaultScenario() const;
   // The folders with explanations, those of the user first.

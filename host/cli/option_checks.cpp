@@ -1,7 +1,11 @@
 #include "host/cli/option_checks.h"
 
+#include "contract/message_format.h"
 #include "host/device/phone.h"
 #include "host/error/exit_code.h"
+#include "host/report/report_format.h"
+#include "host/text/shell_word.h"
+#include "host/text/table.h"
 
 #include <CLI/CLI.hpp>
 
@@ -28,6 +32,25 @@ void checkPhone(const CLI::App& command, const std::filesystem::path& phone) {
     if (command.get_option(option)->count() == 0) continue;
     throw CommandError(ExitCode::kUsage, std::string(option) + " applies only to simulated phones; --phone '" +
                                              phone.string() + "' is this machine, which always runs in real time");
+  }
+}
+
+void warnOfSuffixes(const Options& options, std::ostream& err) {
+  if (options.command == Command::kPhone && options.names.front() == "probe") return;
+  std::vector<OutputRequest> outputs = options.report.outputs;
+  outputs.insert(outputs.begin(), {options.report.format, options.report.output});
+  for (const OutputRequest& output : outputs) {
+    const std::optional<Format> other = otherFormatOfSuffix(output);
+    if (!other) continue;
+    const std::string name(nameOf(*other));
+    err << formatMessage("quazor: the %@ report goes to '%@', whose suffix suggests %@", nameOf(output.format),
+                         printable(output.file.string()), name);
+    if (writesSeveralFormats(options.command)) {
+      err << "; for that, use --output " << printable(shellWord(name + ":" + output.file.string()));
+    } else if (*other == Format::kText || *other == Format::kJson) {
+      err << "; for that, use --format " << name;
+    }
+    err << '\n';
   }
 }
 

@@ -4,6 +4,7 @@
 #include "host/cli/command_line.h"
 
 #include <filesystem>
+#include <ostream>
 #include <string>
 
 namespace CLI {
@@ -12,13 +13,16 @@ class App;
 
 namespace quazor {
 
-// All throw a CommandError (kUsage).
+// All but warnOfSuffixes() throw a CommandError (kUsage).
 
 // CLI11 accepts an empty option value; quazor does not.
 void refuseEmpty(const CLI::App& command, const char* option);
 
 // --seed and --realtime have no effect on a real machine, so they are rejected there.
 void checkPhone(const CLI::App& command, const std::filesystem::path& phone);
+
+// Warns of each report whose file has the suffix of another format. `phone probe` writes JSON in any case.
+void warnOfSuffixes(const Options& options, std::ostream& err);
 
 // Exactly one of names, --all and --only failed must be present.
 void checkNames(const Options& options, const std::string& what);

@@ -150,10 +150,10 @@ class AttemptsTest(RecordTest):
 
     def test_what_varied(self):
         done = self.run_script("ppfpepfp", "--repeat", "4", "--output", f"json:{self.output}")
-        self.assertIn("What varied between the repetitions:\n"
+        self.assertIn("What varied between the repetitions (#: the first repetition with that value):\n"
                       "Scripted.One: 1 passed, 2 failed, 1 ended in an error\n"
-                      "  Result  Count  Minimum  Median  Maximum  Unit    Limit\n"
-                      "  Value       3        1       1       10  frames  Enough: >= 5\n"
+                      "  Result  Count  Minimum  #  Median  Maximum  #  Unit    Limit\n"
+                      "  Value       3        1  2       1       10  1  frames  Enough: >= 5\n"
                       "  1 other result never varied\n"
                       "Scripted.Two: 4 passed\n"
                       "  2 results never varied\n", done.stdout)
@@ -162,15 +162,50 @@ class AttemptsTest(RecordTest):
         self.assertEqual(one["verdicts"], {"pass": 1, "flaky": 0, "fail": 2, "error": 1, "skip": 0})
         self.assertEqual([(it["name"], it["values"], it["minimum"], it["median"], it["maximum"], it["limit"]["name"])
                           for it in one["varying"]], [("Value", 3, 1, 1, 10, "Enough")])
+        self.assertEqual([(it["minimumRepetition"], it["maximumRepetition"]) for it in one["varying"]], [(2, 1)])
         self.assertEqual((one["constant"], two["constant"], two["varying"]), (1, 2, []))
+
+    def test_the_text_of_repetitions_has_a_line_for_each_and_what_did_not_pass(self):
+        script = "ppfpep"
+        expected = ("Repetition 1 of 3: 2 passed\n"
+                    "FAIL  Scripted.One  repetition 2 of 3, 2 results, 2 with limits, 1 failed\n"
+                    "Repetition 2 of 3: 1 passed, 1 failed\n"
+                    "ERROR Scripted.One  repetition 3 of 3\n"
+                    "Repetition 3 of 3: 1 passed, 1 ended in an error\n")
+        report = self.directory / "report.txt"
+        done = self.run_script(script, "--repeat", "3", "--output", f"text:{report}")
+        self.assertEqual(done.stdout, report.read_text())
+        short = [line + "\n" for line in done.stdout.splitlines() if line.startswith(("PASS", "FAIL  S", "ERROR S", "Rep"))]
+        self.assertEqual("".join(short[:5]), expected)
+        self.assertIn("Repetition 3 of 3: 1 passed, 1 ended in an error\n\nWhat varied", done.stdout)
+        self.assertRegex(done.stdout, r"\n  Value +1  frames  Enough: >= 5  fail\n")
+        beside = self.run_script(script, "--repeat", "3", "--format", "json", "--output", self.output).stdout
+        self.assertTrue(beside.startswith("Repetition 1 of 3: 2 passed\nFAIL  Scripted.One\nRepetition 2 of 3: "), beside)
+        verbose = self.run_script(script, "--repeat", "3", "--verbose").stdout
+        self.assertEqual(verbose.count("\n  PASS\n    repetition "), 4)
+        self.assertNotIn("Repetition ", verbose)
+
+    def test_what_the_text_of_repetitions_does_not_leave_out(self):
+        text = self.run_script("pepp", "--repeat", "2", "--attempts", "2").stdout
+        self.assertIn("ERROR Scripted.Two  repetition 1 of 2, attempt 1 of 2\n", text)
+        self.assertIn("PASS  Scripted.Two  repetition 1 of 2, pass in attempt 2 of 2, 2 results", text)
+        self.assertIn("\nRepetition 1 of 2: 1 passed, 1 flaky\nRepetition 2 of 2: 2 passed\n", text)
+        text = self.run_script("pppp", "--repeat", "2", "--skip", "Scripted.Two=covered", "--allow-skips").stdout
+        self.assertTrue(text.startswith("Repetition 1 of 2: 1 passed, 1 skipped\nRepetition 2 of 2: "), text)
+        self.assertIn("\nSKIP  Scripted.Two: not-allowed: covered (2 times, first in repetition 1 of 2)\n", text)
+        profile = self.write("warn.json", json.dumps({"schema": 1, "diagnostics": {"Scripted.One": {"limits": [
+            {"limit": "Value > 10", "severity": "warn"}]}}}))
+        text = self.run_script("pppp", "--repeat", "2", "--parameters", profile).stdout
+        self.assertEqual(text.count("PASS  Scripted.One  repetition "), 2)
+        self.assertNotIn("PASS  Scripted.Two", text)
 
     def test_what_varied_has_the_limits_of_the_user(self):
         done = self.run_script("ppfp", "--repeat", "2", "--limit", "Scripted.One:Value >= 3 frames", "--limit",
                                "Value == 10 +- 9", "--output", f"json:{self.output}")
-        self.assertIn("  Result  Count  Minimum  Median  Maximum  Unit    Limit\n"
-                      "  Value       2        1     5.5       10  frames  Enough: >= 5\n"
-                      "  Value       2        1     5.5       10  frames  Value >= 3 frames (command line)\n"
-                      "  Value       2        1     5.5       10  frames  Value == 10 +- 9 (command line)\n"
+        self.assertIn("  Result  Count  Minimum  #  Median  Maximum  #  Unit    Limit\n"
+                      "  Value       2        1  2     5.5       10  1  frames  Enough: >= 5\n"
+                      "  Value       2        1  2     5.5       10  1  frames  Value >= 3 frames (command line)\n"
+                      "  Value       2        1  2     5.5       10  1  frames  Value == 10 +- 9 (command line)\n"
                       "  1 other result never varied\n", done.stdout)
         one, _ = json.loads(self.output.read_text())["variation"]
         self.assertEqual(one["varying"][0]["userLimits"],
@@ -182,7 +217,9 @@ class AttemptsTest(RecordTest):
                                command="experiment")
         self.assertEqual(done.returncode, 2, done.stderr)
         self.assertIn("ScriptedExperiment: 1 returned a result, 1 flaky\n", done.stdout)
-        self.assertIn("  Value       2        1     5.5       10  frames  -\n", done.stdout)
+        self.assertIn("  Value       2        1  2     5.5       10  1  frames  -\n", done.stdout)
+        self.assertEqual(done.stdout.count("\n  Measurement "), 2)
+        self.assertNotIn("Repetition ", done.stdout)
         self.assertIn("2 runs: 1 returned a result, 0 ended in an error, 1 flaky\n", done.stdout)
 
     def test_only_what_counts_is_run_again(self):

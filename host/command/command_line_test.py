@@ -53,6 +53,7 @@ class RefusalTest(CommandLineTest):
         rows = [
             ("--bogus", {"arguments": ["--bogus"]}),
             ("there is no diagnostic 'Fake.Oen'; did you mean 'Fake.One'?", {"names": ["Fake.Oen"]}),
+            ("there is no diagnostic 'Fake'; did you mean 'Fake*'?", {"names": ["Fake"]}),
             ("no diagnostic matches 'X*'", {"names": ["Fake.One", "X*"]}),
             ("name the diagnostics to run", {"names": []}),
             ("has a parameter 'measurd'; did you mean 'measured'?", {"arguments": ["--set", "measurd=1"]}),

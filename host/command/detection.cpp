@@ -96,46 +96,93 @@ void addLog(std::vector<std::string>& changes, const DiagnosticRecord& healthy, 
   }
 }
 
-std::string detectionText(const Detection& detection, bool healthy) {
-  if (healthy) return detection.found == 0 ? "passed" : "FALSE ALARM";
+std::string detectionText(const Detection& detection, std::string_view ifNothingIsFound) {
+  if (detection.found == 0) return std::string(ifNothingIsFound);
   if (detection.isComplete()) return "detected";
-  if (detection.found == 0) return "not detected";
   return formatMessage("in %@ of %@ seeds", detection.found, detection.seeds);
 }
 
-std::string strictText(const PhoneDetection& one) {
-  return one.byStrict ? detectionText(*one.byStrict, one.healthy) : "not installed";
+std::string byDefaultText(const PhoneDetection& one) {
+  if (one.kind() == PhoneKind::kFaulty) return detectionText(one.byDefault, "not detected");
+  return one.byDefault.found == 0 ? "passed" : "FALSE ALARM";
 }
 
-void printBlindSpot(std::ostream& out, const PhoneDetection& one) {
+// Limits that are stricter may detect a change that passes otherwise.
+std::string strictText(const PhoneDetection& one) {
+  if (!one.byStrict) return "not installed";
+  switch (one.kind()) {
+    case PhoneKind::kFaulty: return detectionText(*one.byStrict, "not detected");
+    case PhoneKind::kChanged: return detectionText(*one.byStrict, "passed");
+    case PhoneKind::kHealthy: break;
+  }
+  return one.byStrict->found == 0 ? "passed" : "FALSE ALARM";
+}
+
+void printReasons(std::ostream& out, const PhoneDetection& one) {
   out << '\n';
   printWrapped(out, one.phone + " (by strict: " + strictText(one) + ")", "  ", "    ");
   if (!one.title.empty()) printWrapped(out, one.title, "    ", "    ");
   for (const std::string& reason : one.reasons) printWrapped(out, reason, "    - ", "      ");
 }
 
-std::string countsText(std::string_view by, std::size_t detected, std::size_t faulty, std::size_t falseAlarms) {
-  return formatMessage("By %@: %@ of %@ detected, %@, %@\n", by, detected, countText(faulty, "fault"),
-                       countText(faulty - detected, "blind spot"), countText(falseAlarms, "false alarm"));
+bool isBlindSpot(const PhoneDetection& one) { return one.kind() == PhoneKind::kFaulty && !one.byDefault.isComplete(); }
+
+bool isPassedChange(const PhoneDetection& one) { return one.kind() == PhoneKind::kChanged && one.byDefault.found == 0; }
+
+void printThose(std::ostream& out, const std::vector<PhoneDetection>& phones, bool (*isMeant)(const PhoneDetection&),
+                std::string_view heading) {
+  for (const PhoneDetection& one : phones) {
+    if (!isMeant(one)) continue;
+    out << heading;
+    heading = "";
+    printReasons(out, one);
+  }
+}
+
+void count(ProfileTotals& totals, PhoneKind kind, const Detection& detection, bool mayDetectChanges) {
+  switch (kind) {
+    case PhoneKind::kFaulty: ++(detection.isComplete() ? totals.detected : totals.blindSpots); return;
+    case PhoneKind::kChanged:
+      if (detection.found == 0) ++totals.changesPassed;
+      if (mayDetectChanges) return;
+      break;
+    case PhoneKind::kHealthy: break;
+  }
+  if (detection.found > 0) ++totals.falseAlarms;
+}
+
+std::string countsText(std::string_view by, const DetectionTotals& all, const ProfileTotals& totals) {
+  std::string text =
+      formatMessage("By %@: %@ of %@ detected, %@, %@", by, totals.detected, countText(all.faulty, "fault"),
+                    countText(totals.blindSpots, "blind spot"), countText(totals.falseAlarms, "false alarm"));
+  if (all.changed > 0)
+    text += formatMessage(", %@ of %@ passed", totals.changesPassed, countText(all.changed, "change"));
+  return text + "\n";
 }
 
 Json detectionJson(const Detection& detection) { return {{"seeds", detection.seeds}, {"detected", detection.found}}; }
+
+Json totalsOfProfileJson(const ProfileTotals& totals) {
+  return {{"detected", totals.detected},
+          {"blindSpots", totals.blindSpots},
+          {"falseAlarms", totals.falseAlarms},
+          {"changesPassed", totals.changesPassed}};
+}
 
 }  // namespace
 
 DetectionTotals totalsOf(const std::vector<PhoneDetection>& phones) {
   DetectionTotals totals;
   for (const PhoneDetection& one : phones) {
-    if (one.byStrict) totals.hasStrict = true;
-    if (one.healthy) {
-      ++totals.healthy;
-      if (one.byDefault.found > 0) ++totals.falseAlarms;
-      if (one.byStrict && one.byStrict->found > 0) ++totals.falseAlarmsOfStrict;
-    } else {
-      ++totals.faulty;
-      if (one.byDefault.isComplete()) ++totals.detected;
-      if (one.byStrict && one.byStrict->isComplete()) ++totals.detectedByStrict;
+    switch (one.kind()) {
+      case PhoneKind::kFaulty: ++totals.faulty; break;
+      case PhoneKind::kChanged: ++totals.changed; break;
+      case PhoneKind::kHealthy: ++totals.healthy; break;
     }
+    count(totals.byDefault, one.kind(), one.byDefault, false);
+    if (!one.byStrict) continue;
+    if (!totals.byStrict) totals.byStrict.emplace();
+    count(*totals.byStrict, one.kind(), *one.byStrict, true);
   }
   return totals;
 }
@@ -161,25 +208,17 @@ void printDetections(std::ostream& out, const std::vector<PhoneDetection>& phone
   Table table({Align::kLeft, Align::kLeft, Align::kLeft, Align::kLeft});
   table.addHeader({"Phone", "Expected", "By default", "By strict"});
   for (const PhoneDetection& one : phones) {
-    const std::string_view expected = one.healthy ? "passed" : one.isExpected ? "detected" : "not detected";
-    table.addRow(
-        {printable(one.phone), std::string(expected), detectionText(one.byDefault, one.healthy), strictText(one)});
+    const std::string_view expected = one.kind() == PhoneKind::kFaulty ? "detected" : "passed";
+    table.addRow({printable(one.phone), std::string(expected), byDefaultText(one), strictText(one)});
   }
   table.print(out, "");
-  std::string_view heading = "\nNot detected by default, and why:\n";
-  for (const PhoneDetection& one : phones) {
-    if (one.healthy || one.byDefault.isComplete()) continue;
-    out << heading;
-    heading = "";
-    printBlindSpot(out, one);
-  }
+  printThose(out, phones, isBlindSpot, "\nNot detected by default, and why:\n");
+  printThose(out, phones, isPassedChange, "\nPassed by default as the phone expects, and what differs:\n");
 }
 
 void printTotals(std::ostream& out, const DetectionTotals& totals) {
-  out << countsText("default", totals.detected, totals.faulty, totals.falseAlarms);
-  if (totals.hasStrict) {
-    out << countsText("strict", totals.detectedByStrict, totals.faulty, totals.falseAlarmsOfStrict);
-  }
+  out << countsText("default", totals, totals.byDefault);
+  if (totals.byStrict) out << countsText("strict", totals, *totals.byStrict);
 }
 
 Json detectionsJson(const std::vector<PhoneDetection>& phones) {
@@ -197,18 +236,11 @@ Json detectionsJson(const std::vector<PhoneDetection>& phones) {
 }
 
 Json totalsJson(const DetectionTotals& totals) {
-  Json json = {
-      {"faulty", totals.faulty},
-      {"healthy", totals.healthy},
-      {"default",
-       {{"detected", totals.detected}, {"blindSpots", totals.blindSpots()}, {"falseAlarms", totals.falseAlarms}}},
-      {"strict", nullptr}};
-  if (totals.hasStrict) {
-    json["strict"] = {{"detected", totals.detectedByStrict},
-                      {"blindSpots", totals.blindSpotsOfStrict()},
-                      {"falseAlarms", totals.falseAlarmsOfStrict}};
-  }
-  return json;
+  return {{"faulty", totals.faulty},
+          {"changed", totals.changed},
+          {"healthy", totals.healthy},
+          {"default", totalsOfProfileJson(totals.byDefault)},
+          {"strict", totals.byStrict ? totalsOfProfileJson(*totals.byStrict) : Json()}};
 }
 
 }  // namespace quazor

@@ -22,6 +22,12 @@ struct Detection {
   bool isComplete() const { return found == seeds; }
 };
 
+enum class PhoneKind {
+  kHealthy,  // the phone that the others are compared with
+  kFaulty,   // its scenario expects that a run does not pass
+  kChanged,  // its scenario expects that every run passes, whatever differs
+};
+
 struct PhoneDetection {
   std::string phone;
   std::string title;                  // of its scenario
@@ -29,33 +35,42 @@ struct PhoneDetection {
   bool isExpected = false;            // its scenario expects that a run does not pass
   Detection byDefault;                // with the default profile
   std::optional<Detection> byStrict;  // with the profile strict; nothing if it is not installed
-  std::vector<std::string> reasons;   // why its fault is not detected by default
+  std::vector<std::string> reasons;   // why what differs from the healthy phone is not detected by default
+
+  PhoneKind kind() const {
+    if (healthy) return PhoneKind::kHealthy;
+    return isExpected ? PhoneKind::kFaulty : PhoneKind::kChanged;
+  }
 };
 
-// The totals of the matrix.
+// What the limits of one profile find on all phones.
+struct ProfileTotals {
+  std::size_t detected = 0;       // faulty phones, with every seed
+  std::size_t blindSpots = 0;     // the other faulty phones
+  std::size_t falseAlarms = 0;    // on phones that must pass
+  std::size_t changesPassed = 0;  // changed phones on which every run passed
+};
+
+// The totals of the matrix. A changed phone that the profile strict detects is no false alarm.
 struct DetectionTotals {
   std::size_t faulty = 0;
+  std::size_t changed = 0;
   std::size_t healthy = 0;
-  std::size_t detected = 0;  // with every seed
-  std::size_t falseAlarms = 0;
-  std::size_t detectedByStrict = 0;
-  std::size_t falseAlarmsOfStrict = 0;
-  bool hasStrict = false;
-
-  std::size_t blindSpots() const { return faulty - detected; }
-  std::size_t blindSpotsOfStrict() const { return faulty - detectedByStrict; }
+  ProfileTotals byDefault;
+  std::optional<ProfileTotals> byStrict;
 };
 
 DetectionTotals totalsOf(const std::vector<PhoneDetection>& phones);
 
-// The differences between a run that passed on a phone with a fault and the same run on the healthy phone, each with
-// the reason why it does not make the run fail; empty if the fault changes nothing.
+// The differences between a run that passed on another phone and the same run on the healthy phone, each with the
+// reason why it does not make the run fail; empty if nothing differs.
 std::vector<std::string> undetectedChanges(const DiagnosticRecord& healthy, const DiagnosticRecord& record);
 
-// Prints a line for each phone, then those whose fault is not detected, with the reasons.
+// Prints a line for each phone, then those with a fault that is not detected, and those with a change that passes, with
+// the reasons.
 void printDetections(std::ostream& out, const std::vector<PhoneDetection>& phones);
 
-// Prints the numbers of detected faults, blind spots and false alarms.
+// Prints the numbers of detected faults, blind spots, false alarms and changes that passed.
 void printTotals(std::ostream& out, const DetectionTotals& totals);
 
 nlohmann::ordered_json detectionsJson(const std::vector<PhoneDetection>& phones);

@@ -65,46 +65,61 @@ TEST(UndetectedChanges, NameThreeAndCountTheRest) {
 
 std::vector<PhoneDetection> phones() {
   return {{"found", "", false, true, {3, 3}, Detection{3, 3}, {}},
-          {"blind", "Its title.", false, false, {3, 0}, Detection{3, 3}, {"D: a reason"}},
+          {"changed", "Its title.", false, false, {3, 0}, Detection{3, 3}, {"D: a reason"}},
           {"sometimes", "", false, true, {3, 1}, Detection{3, 1}, {"D: seeds"}},
           {"healthy", "", true, false, {3, 0}, Detection{3, 1}, {}}};
 }
 
 TEST(Detections, AreCountedForBothProfiles) {
   const DetectionTotals totals = totalsOf(phones());
-  EXPECT_EQ(totals.faulty, 3U);
+  EXPECT_EQ(totals.faulty, 2U);
+  EXPECT_EQ(totals.changed, 1U);
   EXPECT_EQ(totals.healthy, 1U);
-  EXPECT_EQ(totals.detected, 1U);
-  EXPECT_EQ(totals.blindSpots(), 2U);
-  EXPECT_EQ(totals.falseAlarms, 0U);
-  EXPECT_EQ(totals.detectedByStrict, 2U);
-  EXPECT_EQ(totals.falseAlarmsOfStrict, 1U);
   std::ostringstream out;
   printTotals(out, totals);
   EXPECT_EQ(out.str(),
-            "By default: 1 of 3 faults detected, 2 blind spots, 0 false alarms\n"
-            "By strict: 2 of 3 faults detected, 1 blind spot, 1 false alarm\n");
-  EXPECT_EQ(totalsJson(totals)["default"]["blindSpots"], 2);
+            "By default: 1 of 2 faults detected, 1 blind spot, 0 false alarms, 1 of 1 change passed\n"
+            "By strict: 1 of 2 faults detected, 1 blind spot, 1 false alarm, 0 of 1 change passed\n");
+  EXPECT_EQ(totalsJson(totals)["changed"], 1);
+  EXPECT_EQ(totalsJson(totals)["default"],
+            (nlohmann::ordered_json{{"detected", 1}, {"blindSpots", 1}, {"falseAlarms", 0}, {"changesPassed", 1}}));
+  EXPECT_EQ(totalsJson(totals)["strict"],
+            (nlohmann::ordered_json{{"detected", 1}, {"blindSpots", 1}, {"falseAlarms", 1}, {"changesPassed", 0}}));
 }
 
-TEST(Detections, ListTheBlindSpotsWithTheirReasons) {
+TEST(Detections, CountAChangeThatDoesNotPassByDefaultAsAFalseAlarm) {
+  const std::vector<PhoneDetection> changed = {{"changed", "", false, false, {3, 1}, Detection{3, 3}, {}}};
+  const DetectionTotals totals = totalsOf(changed);
+  EXPECT_EQ(totals.byDefault.falseAlarms, 1U);
+  EXPECT_EQ(totals.byDefault.changesPassed, 0U);
+  EXPECT_EQ(totals.byStrict->falseAlarms, 0U);
+  std::ostringstream out;
+  printDetections(out, changed);
+  EXPECT_EQ(out.str(),
+            "Phone    Expected  By default   By strict\n"
+            "changed  passed    FALSE ALARM  detected\n");
+}
+
+TEST(Detections, ListBlindSpotsAndPassedChangesWithTheirReasons) {
   std::ostringstream out;
   printDetections(out, phones());
   EXPECT_EQ(out.str(),
-            "Phone      Expected      By default       By strict\n"
-            "found      detected      detected         detected\n"
-            "blind      not detected  not detected     detected\n"
-            "sometimes  detected      in 1 of 3 seeds  in 1 of 3 seeds\n"
-            "healthy    passed        passed           FALSE ALARM\n"
+            "Phone      Expected  By default       By strict\n"
+            "found      detected  detected         detected\n"
+            "changed    passed    passed           detected\n"
+            "sometimes  detected  in 1 of 3 seeds  in 1 of 3 seeds\n"
+            "healthy    passed    passed           FALSE ALARM\n"
             "\n"
             "Not detected by default, and why:\n"
             "\n"
-            "  blind (by strict: detected)\n"
-            "    Its title.\n"
-            "    - D: a reason\n"
-            "\n"
             "  sometimes (by strict: in 1 of 3 seeds)\n"
-            "    - D: seeds\n");
+            "    - D: seeds\n"
+            "\n"
+            "Passed by default as the phone expects, and what differs:\n"
+            "\n"
+            "  changed (by strict: detected)\n"
+            "    Its title.\n"
+            "    - D: a reason\n");
 }
 
 TEST(Detections, SayWhereTheProfileStrictIsNotInstalled) {
@@ -112,7 +127,7 @@ TEST(Detections, SayWhereTheProfileStrictIsNotInstalled) {
   for (PhoneDetection& one : all) one.byStrict.reset();
   std::ostringstream out;
   printDetections(out, all);
-  EXPECT_THAT(out.str(), testing::HasSubstr("found      detected      detected         not installed\n"));
+  EXPECT_THAT(out.str(), testing::HasSubstr("found      detected  detected         not installed\n"));
   EXPECT_TRUE(totalsJson(totalsOf(all))["strict"].is_null());
 }
 

@@ -88,7 +88,9 @@ class Doctor {
     }
     for (const std::filesystem::path& file : files) {
       check("profile", file.string(), [&] {
-        const Profile read = readProfile(file);
+        const std::vector<Profile> all = readProfileAndBases(file, installation_.profileSource());
+        for (const Profile& one : all) one.mistakes.throwIfAny();
+        const Profile& read = all.back();
         return "entries for " + countText(read.entries.size(), "diagnostic") + " and " +
                countText(read.experiments.size(), "experiment") + (file == byDefault ? "; the default profile" : "");
       });

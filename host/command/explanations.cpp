@@ -10,6 +10,7 @@
 
 #include <algorithm>
 #include <array>
+#include <cctype>
 #include <charconv>
 #include <map>
 #include <optional>
@@ -257,6 +258,28 @@ std::string nearestDomain(const std::vector<Explanation>& explanations, const st
                                     : "did you mean '" + nearest + "'?"));
 }
 
+// True if the text has the word between others.
+bool hasWord(const std::string& text, const std::string& word) {
+  const auto isInWord = [&text](std::size_t at) {
+    const auto unit = at < text.size() ? static_cast<unsigned char>(text[at]) : '\0';
+    return unit == '_' || unit > 0x7F || std::isalnum(unit) != 0;
+  };
+  for (std::size_t at = text.find(word); at != std::string::npos; at = text.find(word, at + 1)) {
+    if (!(at > 0 && isInWord(at - 1)) && !isInWord(at + word.size())) return true;
+  }
+  return false;
+}
+
+// The first explanation that mentions what has none itself, such as the limit of a result.
+const Explanation* findMention(const std::vector<Explanation>& explanations, const std::string& asked) {
+  constexpr std::size_t kMinLength = 4;  // shorter words are everywhere
+  if (asked.size() < kMinLength) return nullptr;
+  const auto found = std::ranges::find_if(explanations, [&asked](const Explanation& one) {
+    return hasWord(one.failing, asked) || hasWord(one.meaning, asked) || hasWord(one.title, asked);
+  });
+  return found == explanations.end() ? nullptr : &*found;
+}
+
 [[noreturn]] void refuseName(const std::vector<Explanation>& explanations, const std::string& asked) {
   std::vector<std::string> known;
   for (const Explanation& one : explanations) {
@@ -264,7 +287,9 @@ std::string nearestDomain(const std::vector<Explanation>& explanations, const st
     known.insert(known.end(), one.symbols.begin(), one.symbols.end());
     if (one.isError()) known.push_back(one.domain);
   }
-  const std::string nearest = didYouMean(asked, known);
+  std::string nearest = didYouMean(asked, known);
+  const Explanation* const mention = nearest.empty() ? findMention(explanations, asked) : nullptr;
+  if (mention != nullptr) nearest = "; that of '" + keysOf(*mention).front() + "' mentions it";
   throw CommandError(ExitCode::kUsage,
                      formatMessage("no explanation of '%@'%@", asked,
                                    nearest.empty() ? "; 'quazor explain' lists all explanations" : nearest));

@@ -220,6 +220,19 @@ TEST(FindExplanations, TellsTheNearestDomainWhateverItsEnding) {
             "the error on the line above");
 }
 
+TEST(FindExplanations, TellsWhichOneMentionsIt) {
+  const std::vector<Explanation> all = parseExplanations(
+      "f",
+      R"({"schema": 1, "names": [{"names": ["Total"], "kind": "result", "from": ["D"], "title": "t", "meaning": "m",
+                "failing": "Its limit, TotalLimit, is its own total.", "causes": ["c"], "next": ["n"]}]})");
+  const auto problemOf = [&all](const char* asked) {
+    return refusalOf(ExitCode::kUsage, [&] { findExplanations(all, asked); });
+  };
+  EXPECT_EQ(problemOf("TotalLimit"), "no explanation of 'TotalLimit'; that of 'Total' mentions it");
+  EXPECT_EQ(problemOf("talLimit"), "no explanation of 'talLimit'; 'quazor explain' lists all explanations");
+  EXPECT_EQ(problemOf("its"), "no explanation of 'its'; 'quazor explain' lists all explanations");
+}
+
 TEST(FindExplanations, RefusesWhatHasNoneAndTellsTheNearest) {
   const std::vector<Explanation> all = fewExplanations();
   const NamedRefusal rows[] = {

@@ -89,7 +89,11 @@ class InterruptTest(CommandLineTest):
                 out = self.interrupted(*way)
                 self.assertIn("Broken.Nothing", out)
                 self.assertRegex(out, r"QuazorHostErrorDomain code 11: .*Fake\.One was interrupted")
-                self.assertIn("2 diagnostics: 0 passed, 0 failed, 2 ended in an error", out)
+                self.assertIn("2 diagnostics: 0 passed, 0 failed, 2 ended in an error, 1 not reached\n", out)
+
+    def test_repetitions_that_were_not_reached_are_counted(self):
+        out = self.interrupted("--repeat", "3")
+        self.assertIn("2 runs: 0 passed, 0 failed, 2 ended in an error, 7 not reached\n", out)
 
     def test_every_output_file_is_written(self):
         for way in self.WAYS:

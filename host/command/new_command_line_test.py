@@ -19,8 +19,8 @@ class NewCommandTest(CommandLineTest):
         self.assertEqual(result.returncode, 0, result.stderr)
         project = self.directory / "light_check"
         files = {path.name: path.read_text() for path in project.rglob("*") if path.is_file()}
-        self.assertEqual(set(files), {"CMakeLists.txt", "README.md", "light_check.cpp", "light_check.json", "few_events.json",
-                                      "many_events.json", "channel_missing.json", "report_refused.json"})
+        self.assertEqual(set(files), {"CMakeLists.txt", "README.md", "light_check.cpp", "light_check.json", "light_check_errors.json",
+                                      "few_events.json", "many_events.json", "channel_missing.json", "report_refused.json"})
         self.assertIn('addDiagnosticWithName("LightCheckDiagnostic"', files["light_check.cpp"])
         self.assertIn("quazor_add_plugin(light_check light_check.cpp)", files["CMakeLists.txt"])
         self.assertEqual(list(json.loads(files["few_events.json"])["expect"]), ["LightCheckDiagnostic"])

@@ -182,6 +182,49 @@ class OutputFilesTest(CommandLineTest):
         self.assertEqual(result.returncode, 0, result.stderr)
         self.assertIn("Fake.One", pathlib.Path(self.directory / "xml:report").read_text())
 
+    @staticmethod
+    def told(result):
+        """The lines on standard error that are not of the log."""
+        return [line for line in result.stderr.splitlines() if line.startswith("quazor: ")]
+
+    def test_a_format_behind_the_file(self):
+        for swapped in ("report.pdf:junit", "report:json", "a:b:csv"):
+            file, form = swapped.rsplit(":", 1)
+            with self.subTest(swapped):
+                result = self.run_fake("--output", swapped, cwd=self.directory)
+                self.assert_refused(result, 64, f"--output '{swapped}': the format comes first, as in --output {form}:{file} "
+                                    f"(for a file of this name, write 'text:{swapped}')")
+        for meant, name in (("./x:junit", "x:junit"), ("text:y:junit", "y:junit"), (":json", ":json")):
+            with self.subTest(meant):
+                result = self.run_fake("--output", meant, cwd=self.directory)
+                self.assertEqual((result.returncode, self.told(result)), (0, []))
+                self.assertIn("Fake.One", pathlib.Path(self.directory / name).read_text())
+
+    def test_a_suffix_that_contradicts_the_format_is_a_warning(self):
+        for output, form, suggested in (("junit:r.json", "junit", "json"), ("json:r.xml", "json", "junit"),
+                                        ("r.JSON", "text", "json"), ("csv:r.txt", "csv", "text"), ("json:r.jsonl", "json", "ocp")):
+            with self.subTest(output):
+                file = output.split(":")[-1]
+                result = self.run_fake("--output", output, cwd=self.directory)
+                self.assertEqual(result.returncode, 0, result.stderr)
+                self.assertEqual(self.told(result), [
+                    f"quazor: the {form} report goes to '{file}', whose suffix suggests {suggested}; for that, use "
+                    f"--output {suggested}:{file}"])
+                self.assertTrue((self.directory / file).exists())
+        for output in ("junit:r.xml", "json:r.json", "ocp:r.jsonl", "ocp:r.json", "r.txt", "r.log", "csv:r.csv", "junit:r.pdf", "r"):
+            with self.subTest(output):
+                result = self.run_fake("--output", output, cwd=self.directory)
+                self.assertEqual((result.returncode, self.told(result)), (0, []))
+
+    def test_a_suffix_for_a_command_with_two_formats(self):
+        warning = "quazor: the text report goes to 'l.json', whose suffix suggests json; for that, use --format json\n"
+        result = quazor("list", *PLUGIN, "--output", "l.json", cwd=self.directory)
+        self.assertEqual((result.returncode, result.stderr), (0, warning))
+        result = quazor("list", *PLUGIN, "--format", "json", "--output", "l.json", cwd=self.directory)
+        self.assertEqual((result.returncode, result.stderr), (0, ""))
+        result = quazor("phone", "probe", "--output", "board.json", cwd=self.directory)
+        self.assertEqual((result.returncode, result.stderr), (0, ""))
+
 
 if __name__ == "__main__":
     unittest.main()

@@ -53,6 +53,7 @@ class PluginReview {
     reviewDescriptions();
     readPhones();
     readBesideExplanations();
+    reviewRanges();
     reviewRuns();
     reviewPhones();
     return std::move(findings_);
@@ -234,10 +235,26 @@ class PluginReview {
     for (const fs::path& installed : installation_.explanations()) folders.push_back(installed);
     try {
       readExplanations(folders);
+      addExplainedRanges(folders, scan_.catalogue);
     } catch (const InputError& problem) {
       tell(Rating::kProblem, "explanations", problem.what());
     }
     isExplained_ = explainedTopics(std::move(folders));
+  }
+
+  void reviewRanges() {
+    std::set<std::string> seen;
+    for (const DescribedDiagnostic& one : scan_.catalogue) {
+      if (one.description.error != nullptr) continue;
+      for (const Part part : kParts) {
+        const bool isExperiment = part == Part::kExperiment;
+        const std::string& owner = isExperiment ? one.diagnostic.experimentName : one.diagnostic.analysisName;
+        if ((!isExperiment && one.diagnostic.experimentOnly) || !seen.insert(owner).second) continue;
+        for (const auto& [name, declaration] : one.parameters(part)) {
+          add(reviewParameterRange(owner, name, declaration, one.ranges(part).find(name)));
+        }
+      }
+    }
   }
 
   void reviewRuns() {

@@ -147,6 +147,25 @@ class BadPluginTest(ReviewCase):
             self.assert_said("advice", text, findings)
         self.assertNotIn("Not used. By anything.", str(findings))
 
+    def test_parameters_of_which_too_little_is_known(self):
+        plugin = self.directory / "ranged_plugin.so"
+        shutil.copy(PLUGINS / "ranged_plugin.so", plugin)
+        self.assert_said("advice", "^RangedExperiment: the parameter 'anything' has no range, no unit, no default, so that",
+                         self.review(plugin))
+        (self.directory / "explanations").mkdir()
+
+        def explained(anything):
+            texts = {"title": "T", "meaning": "M", "causes": ["C"], "next": ["N"]}
+            (self.directory / "explanations/ranged.json").write_text(json.dumps({"schema": 1, "names": [
+                {"names": ["RangedExperiment"], "kind": "experiment", "parameters": {"anything": anything}, **texts}]}))
+            return self.review(plugin)
+
+        findings = explained({"minimum": 0, "default": 2})
+        self.assert_said("advice", "^RangedExperiment: the parameter 'anything' has no unit, so that", findings)
+        self.assertNotIn("'anything'", str(explained({"minimum": 0, "default": 2, "unit": "s"})))
+        self.assertNotIn("'anything'", str(explained({"minimum": 0, "default": 2, "integer": True})))
+        self.assert_said("problem", "^explanations: .*its default -1 is not >= 0", explained({"minimum": 0, "default": -1}))
+
     def test_names_of_another_installed_plug_in(self):
         folder = self.directory / "plugins"
         folder.mkdir()

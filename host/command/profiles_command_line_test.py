@@ -114,6 +114,89 @@ class AddedProfileTest(ProfilesCase):
         self.assertRegex(quazor("run", "--help").stdout, r"--parameters FILE\|NAME .*values and limits")
 
 
+class BaseTest(ProfilesCase):
+    BACK = {"CameraSyncDiagnostic.Back": {"experiment": {"duration": 4}}}
+
+    def profile(self, base, diagnostics):
+        return {"schema": 1, "base": base, "diagnostics": diagnostics}
+
+    def described(self, name, *arguments):
+        result = quazor("describe", name, *arguments, env=self.environment)
+        self.assertEqual(result.returncode, 0, result.stderr)
+        return result.stdout
+
+    def test_an_own_default_profile_extends_the_installed_one(self):
+        own = self.add("default", self.profile("default", self.BACK))
+        self.assertRegex(self.described("CameraSyncDiagnostic.Back"), r"duration +4 +profile default\.json")
+        self.assertRegex(self.described("CameraSyncDiagnostic.Front"), r"duration +3 +profile default\.json")
+        self.assertRegex(self.described("TesselFaultDiagnostic"), r"frameCount +90 ")
+        self.assertRegex(self.described("CameraSyncDiagnostic.Back", "--profile", own), r"duration +4 ")
+        self.assertEqual(quazor("run", "--all", env=self.environment).returncode, 0)
+        self.assertEqual(quazor("selftest", "healthy", "--seeds", "1", env=self.environment).returncode, 0)
+
+    def test_the_limits_of_the_base_count_too(self):
+        self.add("mine", self.profile("strict", {"CameraSyncDiagnostic.Back": {"limits": [{"limit": "*.Total <= 90"}]}}))
+        result = quazor("run", "CameraSyncDiagnostic.Back", "--profile", "mine", "--format", "json", env=self.environment)
+        self.assertEqual(result.returncode, 0, result.stderr)
+        self.assertIn("profile strict.json", result.stdout)
+        self.assertIn("profile mine.json", result.stdout)
+
+    def test_a_value_for_a_pattern_overrides_a_base_for_a_name(self):
+        self.add("named", {"schema": 1, "diagnostics": self.BACK})
+        self.add("mine", self.profile("named", {"CameraSync*": {"experiment": {"duration": 5}}}))
+        self.assertRegex(self.described("CameraSyncDiagnostic.Back", "--profile", "mine"), r"duration +5 +profile mine")
+
+    def test_a_file_beside_it(self):
+        self.write("below.json", json.dumps({"schema": 1, "diagnostics": self.BACK}))
+        file = self.write("above.json", json.dumps(self.profile("below.json", {})))
+        self.assertRegex(self.described("CameraSyncDiagnostic.Back", "--profile", file), r"duration +4 +profile below")
+
+    def test_what_is_refused(self):
+        circle = "is itself based on this file; profiles must not be based on each other in a circle."
+        self.write("two.json", json.dumps(self.profile("one.json", {})))
+        rows = {"one.json": ("two.json", circle), "self.json": ("./self.json", circle),
+                "none.json": ("nothing", '"nothing" is neither a file nor the name of another profile'),
+                "number.json": (3, "base: must be a non-empty string, not 3"),
+                "broken.json": ("number.json", "number.json:1: base: ")}
+        for name, (base, problem) in rows.items():
+            with self.subTest(name):
+                file = self.write(name, json.dumps(self.profile(base, {})))
+                self.assert_refused(quazor("describe", "CameraSyncDiagnostic.Back", "--profile", file), 66, problem)
+        self.add("mine", self.profile("mine", {}))
+        result = quazor("doctor", env=self.environment)
+        self.assertEqual(result.returncode, 66)
+        self.assertIn('"mine" is neither a file nor the name of another profile', " ".join(result.stdout.split()))
+
+
+class LimitsForOtherValuesTest(CommandLineTest):
+    REMARK = ("quazor: the limits of the profile strict.json for CameraSyncDiagnostic.* are made for duration=3, but it is "
+              "{} ({})\n")
+
+    def test_a_run_with_other_values_than_the_limits_are_made_for(self):
+        result = quazor("run", "CameraSyncDiagnostic.*", "--profile", "strict", "--set", "duration=2")
+        self.assertEqual((result.returncode, result.stderr), (1, self.REMARK.format(2, "command line")))
+        profile = self.write("longer.json", json.dumps({"schema": 1, "diagnostics": {
+            "CameraSyncDiagnostic.Back": {"experiment": {"duration": 4}}}}))
+        result = quazor("run", "--all", "--parameters", "strict", "--parameters", profile)
+        self.assertEqual((result.returncode, result.stderr), (1, self.REMARK.format(4, "profile longer.json")))
+
+    def test_an_analysis_of_such_a_run(self):
+        record = self.directory / "run.jsonl"
+        self.assertEqual(quazor("run", "CameraSyncDiagnostic.*", "--set", "duration=2", "--record", record).returncode, 0)
+        result = quazor("analyze", record, "--profile", "strict")
+        self.assertEqual((result.returncode, result.stderr), (1, self.REMARK.format(2, "command line")))
+        result = quazor("analyze", record)
+        self.assertEqual((result.returncode, result.stderr), (0, ""))
+
+    def test_nothing_is_said_where_they_fit(self):
+        for arguments in (("--all", "--profile", "strict"), ("--all", "--set", "duration=2"),
+                          ("CameraSyncDiagnostic.Back", "--profile", "strict", "--set", "duration=3.0"),
+                          ("TesselFaultDiagnostic", "--profile", "strict", "--set", "timeout=9")):
+            with self.subTest(arguments):
+                result = quazor("run", *arguments)
+                self.assertEqual((result.returncode, result.stderr), (0, ""))
+
+
 class SuggestedNamesTest(ProfilesCase):
     def test_profiles(self):
         for option in ("--profile", "--parameters"):

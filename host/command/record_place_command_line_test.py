@@ -162,6 +162,24 @@ class FolderTest(RecordTest):
         self.assertEqual(told(result), f"Recorded in {record}")
         self.assert_verifies(record)
 
+    def test_where_one_record_is_to_be_read_a_folder_lists_its_last_records(self):
+        folder = self.directory / "records"
+        (folder / "sub").mkdir(parents=True)
+        other = self.recorded()
+        commands = (["analyze", folder, "--plugin", WORKING], ["diff", folder, other], ["diff", other, folder],
+                    ["run", "--only", "failed", "--of", folder])
+        empty = f"the folder '{folder}' contains no record: no file in it ends in .jsonl\n"
+        for command in commands:
+            with self.subTest(command):
+                self.assert_refused(quazor(*command), 66, empty)
+        for name in ("1.jsonl", "2.jsonl", "sub/3.jsonl", "4.jsonl", "5.jsonl"):
+            (folder / name).write_bytes(other.read_bytes())
+        listed = ", ".join(str(folder / name) for name in ("sub/3.jsonl", "5.jsonl", "4.jsonl"))
+        for command in commands:
+            with self.subTest(command):
+                self.assert_refused(quazor(*command), 66, f"the folder '{folder}' is not a record; name one of the records "
+                                    f"in it: {listed} and 2 more\n")
+
     def test_a_named_record_is_not_told(self):
         self.assertNotIn("Recorded", self.run_fake("--record", self.record).stderr)
 

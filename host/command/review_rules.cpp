@@ -10,6 +10,7 @@
 #include <cstddef>
 #include <cstdio>
 #include <set>
+#include <utility>
 
 namespace quazor {
 
@@ -154,6 +155,23 @@ ReviewFindings reviewParameterName(const std::string& owner, const std::string& 
            formatMessage("the parameter '%@' %@; begin with a small letter and use English letters, digits and "
                          "underscores",
                          name, isUsable ? "is unlike others" : "cannot be set with --set NAME=VALUE")}};
+}
+
+ReviewFindings reviewParameterRange(const std::string& owner, const std::string& name,
+                                    const QZNumberParameter& declaration, const QZParameterRange* range) {
+  const bool hasRange = range != nullptr && (range->minimum() || range->maximum());
+  // An integer may be a position or a choice.
+  const bool hasUnit = range != nullptr && (range->integer() || !range->unit().empty());
+  const bool hasDefault = declaration.required() || (range != nullptr && range->defaultValue());
+  std::string missing;
+  for (const auto& [isThere, what] : {std::pair(hasRange, "range"), {hasUnit, "unit"}, {hasDefault, "default"}}) {
+    if (!isThere) missing += (missing.empty() ? "no " : ", no ") + std::string(what);
+  }
+  if (missing.empty()) return {};
+  return {{Rating::kAdvice, owner,
+           formatMessage("the parameter '%@' has %@, so that 'quazor describe' cannot show it; give it with "
+                         "QZParameterRanges (contract/parameter_range.h) or in explanations",
+                         name, missing)}};
 }
 
 ReviewFindings reviewSummary(const std::string& subject, const std::string& summary, bool mayBeSeveral) {

@@ -32,6 +32,10 @@ ReviewFindings reviewName(std::string_view kind, const std::string& name);
 // The name of a parameter. Empty if nothing is wrong with it.
 ReviewFindings reviewParameterName(const std::string& owner, const std::string& name);
 
+// What is known about the values of a parameter; null if nothing is. Empty if nothing is missing.
+ReviewFindings reviewParameterRange(const std::string& owner, const std::string& name,
+                                    const QZNumberParameter& declaration, const QZParameterRange* range);
+
 // The summary of `subject`, which is one sentence unless it `mayBeSeveral`. Empty if nothing is wrong with it.
 ReviewFindings reviewSummary(const std::string& subject, const std::string& summary, bool mayBeSeveral);
 

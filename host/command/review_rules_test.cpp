@@ -24,6 +24,27 @@ std::string ratings(const ReviewFindings& findings) {
   return text;
 }
 
+TEST(ReviewParameterRange, AsksForRangeUnitAndDefault) {
+  const QZNumberParameter optional("How much.", false);
+  const QZNumberParameter required("How much.", true);
+  const auto said = [](const QZNumberParameter& declaration, const QZParameterRange* range) {
+    const ReviewFindings findings = reviewParameterRange("E", "p", declaration, range);
+    if (findings.empty()) return std::string();
+    const std::string& text = findings.front().text;
+    return text.substr(0, text.find(", so that"));
+  };
+  EXPECT_EQ(said(optional, nullptr), "the parameter 'p' has no range, no unit, no default");
+  EXPECT_EQ(said(required, nullptr), "the parameter 'p' has no range, no unit");
+  QZParameterRange range;
+  range.setMaximum(5);
+  EXPECT_EQ(said(optional, &range), "the parameter 'p' has no unit, no default");
+  range.setDefault(1);
+  EXPECT_EQ(said(optional, &range), "the parameter 'p' has no unit");
+  range.setInteger();
+  EXPECT_EQ(said(optional, &range), "");
+  EXPECT_EQ(ratings(reviewParameterRange("E", "p", optional, nullptr)), "advice");
+}
+
 TEST(ReviewName, JudgesFormKindAndLength) {
   const struct {
     const char* kind;

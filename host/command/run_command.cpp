@@ -198,6 +198,7 @@ ExitCode runCommand(const Options& given, const Installation& installation, Cons
   Selection selection = select(options, installation, signals);
   refuseUnusedSkips(options.choice.skips, selection);
   const ChosenPhone phone = choosePhone(options, installation);
+  tellLimitsForOtherValues(selection.profiles, selection.diagnostics, console.err);
   std::vector<Job> jobs;
   for (ResolvedDiagnostic& one : selection.diagnostics) {
     std::optional<Skip> skip = skipOf(one.described.diagnostic.name, options.choice.skips, phone.absent);
@@ -263,6 +264,7 @@ ExitCode analyzeCommand(const Options& given, const Installation& installation, 
   if (options.plugins.empty()) options.plugins = recordedPlugins(run.began.plugins, installation);
   const Selection selection = select(options, installation, signals);
   std::vector<QZExperimentResult> results(analysable.size());
+  std::vector<ResolvedDiagnostic> rebound;
   std::vector<Job> jobs;
   for (std::size_t i = 0; i < analysable.size(); ++i) {
     const DiagnosticRecord& record = *analysable[i];
@@ -270,7 +272,8 @@ ExitCode analyzeCommand(const Options& given, const Installation& installation, 
       if (one.described.diagnostic.name != record.name) continue;
       results[i].measurements() = record.measurements;
       results[i].auxiliaryData() = record.auxiliaryData;
-      jobs.push_back({{one.described, reboundParameters(record, one)}, &results[i], record.seed});
+      rebound.push_back({one.described, reboundParameters(record, one)});
+      jobs.push_back({rebound.back(), &results[i], record.seed});
       jobs.back().attempt = record.trial.attempt;
       jobs.back().repetition = record.trial.repetition;
     }
@@ -279,6 +282,7 @@ ExitCode analyzeCommand(const Options& given, const Installation& installation, 
   runOptions.logLevel = options.logLevel.value_or(LogLevel::kDefault);
   runOptions.logLimit = options.logLimit;
   RunStarted began = beginningOf(options, installation, jobs, selection.failed);
+  tellLimitsForOtherValues(selection.profiles, rebound, console.err);
   began.phone = run.began.phone;
   began.seed = run.began.seed;
   began.acceptFlaky = run.began.acceptFlaky;

@@ -6,6 +6,7 @@
 #include "host/plugin/plugin_trust.h"
 #include "host/plugin/profile.h"
 #include "host/plugin/profile_check.h"
+#include "host/text/table.h"
 
 #include <algorithm>
 #include <cstddef>
@@ -51,27 +52,33 @@ void leaveOut(const std::string& pattern, bool mayBeNone, std::vector<Diagnostic
   throw CommandError(ExitCode::kUsage, "--except '" + pattern + "' fits nothing of what is selected to run");
 }
 
-// Reads the profile that --profile or --parameters names. Those in the folders of profiles serve any set of plug-ins.
-Profile chosenProfile(const std::filesystem::path& name, const Installation& installation) {
+// Adds the profile in the file, after those that it is based on. Those in the folders of profiles serve any set of
+// plug-ins, and so does what they are based on.
+void addProfile(const std::filesystem::path& file, bool isNamedByPath, const Installation& installation,
+                std::vector<Profile>& profiles) {
+  for (Profile& one : readProfileAndBases(file, installation.profileSource())) {
+    one.mayNameOthers = !isNamedByPath || one.file != file;
+    profiles.push_back(std::move(one));
+  }
+}
+
+// Adds the profile that --profile or --parameters names.
+void addChosenProfile(const std::filesystem::path& name, const Installation& installation,
+                      std::vector<Profile>& profiles) {
   const std::filesystem::path file = installation.profile(name);
-  Profile profile = readProfileToCheck(file);
-  profile.mayNameOthers = file != name;
-  return profile;
+  addProfile(file, file == name, installation, profiles);
 }
 
 std::vector<Profile> profilesOf(const Options& options, const Installation& installation) {
   std::vector<Profile> profiles;
   if (!options.withoutProfile && options.profile.empty()) {
-    profiles.push_back(readProfileToCheck(installation.defaultProfile()));
-    profiles.back().mayNameOthers = true;
+    addProfile(installation.defaultProfile(), false, installation, profiles);
   }
   if (options.recorded) profiles.push_back(*options.recorded);
   if (!options.withoutProfile && !options.profile.empty()) {
-    profiles.push_back(chosenProfile(options.profile, installation));
+    addChosenProfile(options.profile, installation, profiles);
   }
-  for (const std::filesystem::path& name : options.parameterFiles) {
-    profiles.push_back(chosenProfile(name, installation));
-  }
+  for (const std::filesystem::path& name : options.parameterFiles) addChosenProfile(name, installation, profiles);
   return profiles;
 }
 
@@ -171,7 +178,7 @@ Selection select(const Options& options, const Installation& installation, Watch
   for (const DescribedDiagnostic& one : described) catalogue.push_back(one.diagnostic);
 
   const std::vector<Diagnostic> wanted = wantedOf(catalogue, options, !scan.failed.empty());
-  const std::vector<Profile> profiles = profilesOf(options, installation);
+  std::vector<Profile> profiles = profilesOf(options, installation);
   describeForProfiles(options, installation, profiles, described, signals);
   addExplainedRanges(installation.explanations(), described);
   for (const Profile& profile : profiles) checkProfile(profile, described);
@@ -185,16 +192,21 @@ Selection select(const Options& options, const Installation& installation, Watch
     }
   }
   if (!selected.empty()) checkOverrides(settings, selected);
-  Selection selection{{}, std::move(scan.failed), {}};
-  for (const Profile& profile : profiles) {
-    selection.limits.insert(selection.limits.end(), profile.limits.begin(), profile.limits.end());
-  }
+  Selection selection{{}, std::move(scan.failed), limitsOf(profiles), {}};
   selection.limits.insert(selection.limits.end(), options.limits.begin(), options.limits.end());
   for (DescribedDiagnostic& one : selected) {
     ResolvedParameters parameters = resolveParameters(one, profiles, settings);
     selection.diagnostics.push_back({std::move(one), std::move(parameters)});
   }
+  selection.profiles = std::move(profiles);
   return selection;
+}
+
+void tellLimitsForOtherValues(const std::vector<Profile>& profiles, const std::vector<ResolvedDiagnostic>& selected,
+                              std::ostream& err) {
+  for (const Profile& profile : profiles) {
+    for (const std::string& one : limitsForOtherValues(profile, selected)) err << "quazor: " << printable(one) << '\n';
+  }
 }
 
 std::string missingParameterOf(const ResolvedDiagnostic& one, const Options& options,

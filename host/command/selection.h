@@ -6,6 +6,7 @@
 #include "host/run/plugin_scan.h"
 
 #include <filesystem>
+#include <ostream>
 #include <string>
 #include <vector>
 
@@ -15,6 +16,7 @@ struct Selection {
   std::vector<ResolvedDiagnostic> diagnostics;
   std::vector<FailedPlugin> failed;  // could not be loaded
   std::vector<UserLimit> limits;     // of the profiles and the command line, in this order
+  std::vector<Profile> profiles;     // of which these limits and the values of parameters are
 };
 
 // The plug-ins that the options name, or those that are loaded by default, and the limits of their processes.
@@ -46,6 +48,10 @@ PluginScan scanForSelection(const Options& options, const Installation& installa
 // sets a parameter that none of them declares; then all its matches are described. An unknown name is accepted if a
 // plug-in could not be loaded, because that plug-in may define it.
 Selection select(const Options& options, const Installation& installation, WatchedSignals* signals = nullptr);
+
+// Tells the limitsForOtherValues() of the profiles.
+void tellLimitsForOtherValues(const std::vector<Profile>& profiles, const std::vector<ResolvedDiagnostic>& selected,
+                              std::ostream& err);
 
 // Like missingParameterOf() of its parameters; a profile that took the place of the default one may be the reason.
 std::string missingParameterOf(const ResolvedDiagnostic& one, const Options& options, const Installation& installation);

@@ -179,7 +179,9 @@ void printSelftest(std::ostream& out, const SelftestOutcome& outcome) {
   }
   matrix.print(out, "");
   const DetectionTotals totals = totalsOf(outcome.phones);
-  out << formatMessage("\nPhones: %@ with a fault, %@ healthy; runs: %@, seeds of each: %@\n", totals.faulty,
+  const std::string changed =
+      totals.changed == 0 ? "" : formatMessage("%@ with a change that must pass, ", totals.changed);
+  out << formatMessage("\nPhones: %@ with a fault, %@%@ healthy; runs: %@, seeds of each: %@\n", totals.faulty, changed,
                        totals.healthy, rows.size(), outcome.seeds);
   printTotals(out, totals);
   if (differing == 0) {

@@ -26,10 +26,17 @@ namespace {
 
 constexpr const char* kStrict = "strict";  // an installed profile
 
-// The verdict on the run with the limits of the profile in place of its own.
-Verdict verdictWith(DiagnosticRecord record, const Profile& profile) {
+// The profile in the file and what it is based on.
+std::vector<Profile> profilesIn(const std::filesystem::path& file, const Installation& installation) {
+  std::vector<Profile> profiles = readProfileAndBases(file, installation.profileSource());
+  for (const Profile& one : profiles) one.mistakes.throwIfAny();
+  return profiles;
+}
+
+// The verdict on the run with the limits of the profiles in place of its own.
+Verdict verdictWith(DiagnosticRecord record, const std::vector<Profile>& profiles) {
   if (record.verdict == Verdict::kError) return Verdict::kError;
-  record.limits = limitsFor(record.name, profile.limits);
+  record.limits = limitsFor(record.name, limitsOf(profiles));
   return judgeRecord(record, true).verdict;
 }
 
@@ -53,9 +60,9 @@ class Selftest {
         err_(console.err),
         status_(console.showsProgress ? &console.err : nullptr),
         signals_(signals) {
-    profile_ = readProfile(installation.defaultProfile());
+    profiles_ = profilesIn(installation.defaultProfile(), installation);
     const std::filesystem::path strict = installation.namedProfile(kStrict);
-    if (!strict.empty()) strict_ = readProfile(strict);
+    if (!strict.empty()) strict_ = profilesIn(strict, installation);
   }
 
   // Ends at an interrupt; the phone that was running then is left out. A phone that is refused does not keep the others
@@ -143,7 +150,7 @@ class Selftest {
       bool found = false;
       bool foundByStrict = false;
       for (SelftestRow& row : rows) {
-        DiagnosticRecord record = run(file, row.expected, seed, profile_);
+        DiagnosticRecord record = run(file, row.expected, seed, profiles_);
         if (isInterrupted()) return false;
         count(row, record);
         if (record.verdict != Verdict::kPass) found = true;
@@ -198,10 +205,10 @@ class Selftest {
     if (!std::filesystem::exists(file)) return nullptr;
     for (const HealthyRun& one : healthyRuns_) {
       if (one.name == expected.name &&
-          haveSameValues(one.record.parameters, parametersOf(find(expected), expected, profile_)))
+          haveSameValues(one.record.parameters, parametersOf(find(expected), expected, profiles_)))
         return &one.record;
     }
-    healthyRuns_.push_back({expected.name, run(file, expected, 0, profile_)});
+    healthyRuns_.push_back({expected.name, run(file, expected, 0, profiles_)});
     return &healthyRuns_.back().record;
   }
 
@@ -231,8 +238,8 @@ class Selftest {
   const DescribedDiagnostic& find(const ExpectedOutcome& expected) const { return *findLoaded(expected); }
 
   static ResolvedParameters parametersOf(const DescribedDiagnostic& described, const ExpectedOutcome& expected,
-                                         const Profile& profile) {
-    if (!expected.experimentOnly) return resolveParameters(described, {profile}, {});
+                                         const std::vector<Profile>& profiles) {
+    if (!expected.experimentOnly) return resolveParameters(described, profiles, {});
     std::vector<ParameterOverride> settings;
     for (const auto& [name, value] : expected.parameters) {
       // Formats the value like on a command line, where a whole number is an integer.
@@ -242,9 +249,9 @@ class Selftest {
   }
 
   DiagnosticRecord run(const std::filesystem::path& file, const ExpectedOutcome& expected, std::uint64_t seed,
-                       const Profile& profile) {
+                       const std::vector<Profile>& profiles) {
     const DescribedDiagnostic& described = find(expected);
-    const ResolvedParameters parameters = parametersOf(described, expected, profile);
+    const ResolvedParameters parameters = parametersOf(described, expected, profiles);
     RunOptions runOptions;
     runOptions.makePhone = phonesOfScenario(file, false, seed, installation_.scenarioSource());
     runOptions.logLevel = LogLevel::kError;
@@ -258,8 +265,8 @@ class Selftest {
   const IsolationOptions isolation_;
   std::ostream& err_;
   StatusLine status_;
-  Profile profile_;
-  std::optional<Profile> strict_;
+  std::vector<Profile> profiles_;  // the default one and what it is based on
+  std::optional<std::vector<Profile>> strict_;
   WatchedSignals* const signals_;
   std::deque<HealthyRun> healthyRuns_;  // a growing deque does not move them
 };

@@ -20,23 +20,28 @@ BACK = "CameraSyncDiagnostic.Back"
 
 
 class SelftestTest(CommandLineTest):
-    def test_a_blind_spot_has_its_reason_and_what_the_profile_strict_finds(self):
+    def test_a_change_that_must_pass_has_its_reason_and_what_the_profile_strict_finds(self):
         result = quazor("selftest", "healthy", DROPPED, REFUSED, "--seeds", "1")
         self.assertEqual(result.returncode, 0, result.stderr)
-        self.assertRegex(result.stdout, rf"\n{DROPPED} +not detected +not detected +detected\n")
+        self.assertRegex(result.stdout, rf"\n{DROPPED} +passed +passed +detected\n")
         self.assertRegex(result.stdout, rf"\n{REFUSED} +detected +detected +detected\n")
         self.assertRegex(result.stdout, r"\nhealthy +passed +passed +passed\n")
         self.assertIn(f"\n  {DROPPED} (by strict: detected)\n", result.stdout)
         self.assertRegex(" ".join(result.stdout.split()), r"BackTele\.Total is 87 frames instead of 90 frames: its "
                          r"limit changes with it")
-        self.assertIn("By default: 1 of 2 faults detected, 1 blind spot, 0 false alarms\n", result.stdout)
-        self.assertIn("By strict: 2 of 2 faults detected, 0 blind spots, 0 false alarms\n", result.stdout)
+        self.assertIn("\nPassed by default as the phone expects, and what differs:\n", result.stdout)
+        self.assertNotIn("Not detected by default", result.stdout)
+        self.assertIn("\nPhones: 1 with a fault, 1 with a change that must pass, 1 healthy; runs: ", result.stdout)
+        self.assertIn("By default: 1 of 1 fault detected, 0 blind spots, 0 false alarms, 1 of 1 change passed\n", result.stdout)
+        self.assertIn("By strict: 1 of 1 fault detected, 0 blind spots, 0 false alarms, 0 of 1 change passed\n", result.stdout)
 
     def test_the_document_has_the_same(self):
         result = quazor("selftest", DROPPED, "--seeds", "1", "--format", "json")
         document = json.loads(result.stdout)
-        self.assertEqual(document["totals"]["default"], {"detected": 0, "blindSpots": 1, "falseAlarms": 0})
-        self.assertEqual(document["totals"]["strict"], {"detected": 1, "blindSpots": 0, "falseAlarms": 0})
+        self.assertEqual(document["totals"]["default"], {"detected": 0, "blindSpots": 0, "falseAlarms": 0, "changesPassed": 1})
+        self.assertEqual(document["totals"]["strict"],
+                         {"detected": 0, "blindSpots": 0, "falseAlarms": 0, "changesPassed": 0})
+        self.assertEqual((document["totals"]["faulty"], document["totals"]["changed"]), (0, 1))
         phone, = document["phones"]
         self.assertEqual((phone["phone"], phone["expectsDetection"]), (DROPPED, False))
         self.assertTrue(any("BackTele.Total" in one for one in phone["reasons"]), phone)

@@ -38,6 +38,7 @@ class TerminalWidthTest(RecordTest):
             ["run", "--all", "--phone", "camera_sync/start_refused_on_first"],
             ["run", "--all", "--skip", "Camera*=the cameras of this phone are with a colleague in another building"],
             ["run", "CameraSyncDiagnostic.Back", "--log-level", "debug"],
+            ["run", "SingleCameraDiagnostic", "--repeat", "3", "--phone", "single_camera/fast"],
             ["experiment", "NimbeImageExperiment", "--plugin", "sensor_images", "--set", "imagesRequested=1"],
             ["experiment", "CameraSyncExperiment.Back"],
             ["explain"], ["explain", "BackTele.Total"], ["explain", "QZCapturePlugInErrorDomain:206"],

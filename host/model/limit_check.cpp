@@ -11,6 +11,7 @@
 #include <cstdint>
 #include <iterator>
 #include <optional>
+#include <sstream>
 
 namespace quazor {
 
@@ -184,6 +185,46 @@ bool isOfLimit(const DiagnosticRecord& record) {
          record.error->code() == static_cast<std::int64_t>(HostErrorCode::kLimitWithoutResult);
 }
 
+namespace {
+
+std::vector<std::string> partsOf(const std::string& name) {
+  std::vector<std::string> parts;
+  std::istringstream text(name);
+  for (std::string part; std::getline(text, part, '.');) parts.push_back(part);
+  return parts;
+}
+
+// The pattern with those parts between its dots that are no patterns replaced by those of the name, if they are near;
+// nothing if it does not fit the name then.
+std::optional<std::string> patternNear(const std::vector<std::string>& parts, const std::string& name) {
+  const std::vector<std::string> ofName = partsOf(name);
+  if (parts.size() != ofName.size()) return std::nullopt;
+  std::string near;
+  for (std::size_t i = 0; i < parts.size(); ++i) {
+    const bool isKept = isPattern(parts[i]);
+    if (!isKept && !nearestName(parts[i], {ofName[i]})) return std::nullopt;
+    near += (i == 0 ? "" : ".") + (isKept ? parts[i] : ofName[i]);
+  }
+  return matchesName(near, name) ? std::optional(near) : std::nullopt;
+}
+
+// Suggests a result or, for a pattern or a last part alone such as "Totals", a pattern that fits several.
+std::string didYouMeanResult(const std::string& asked, const std::vector<std::string>& names) {
+  if (!isPattern(asked) && nearestName(asked, names)) return didYouMean(asked, names);
+  const bool isLastPart = !isPattern(asked) && asked.find('.') == std::string::npos;
+  const std::vector<std::string> parts = partsOf(isLastPart ? "*." + asked : asked);
+  std::vector<std::string> near;
+  for (const std::string& name : names) {
+    if (const std::optional<std::string> one = patternNear(parts, name)) near.push_back(*one);
+  }
+  const auto nearest = std::min_element(near.begin(), near.end(), [&asked](const auto& one, const auto& other) {
+    return editDistance(asked, one) < editDistance(asked, other);
+  });
+  return nearest == near.end() ? std::string() : "; did you mean '" + *nearest + "'?";
+}
+
+}  // namespace
+
 DiagnosticErrorPtr errorOfLimitWithoutResult(const UserLimit& limit, const std::vector<DiagnosticRecord>& records) {
   std::vector<std::string> names;
   std::vector<std::string> diagnostics;
@@ -194,7 +235,7 @@ DiagnosticErrorPtr errorOfLimitWithoutResult(const UserLimit& limit, const std::
   }
   const bool isMeant = std::any_of(diagnostics.begin(), diagnostics.end(),
                                    [&limit](const std::string& name) { return appliesTo(limit, name); });
-  std::string why = isMeant ? "no result has the name '" + limit.result + "'" + didYouMean(limit.result, names)
+  std::string why = isMeant ? "no result has the name '" + limit.result + "'" + didYouMeanResult(limit.result, names)
                             : "no diagnostic of this run has the name '" + limit.diagnostic + "'" +
                                   didYouMean(limit.diagnostic, diagnostics);
   return hostError(

@@ -241,6 +241,26 @@ TEST(LimitWithoutResult, IsFoundAmongAllDiagnostics) {
   EXPECT_TRUE(without("X > 0", false, {}));
 }
 
+TEST(LimitWithoutResult, HasAnErrorThatNamesAPatternThatIsNear) {
+  const auto suggestionFor = [](const std::string& limit) {
+    DiagnosticRecord record = recordOf("Cameras.Back", Verdict::kPass);
+    record.measuredResults.clear();
+    for (const char* name : {"BackTele.Total", "BackTele.Offset", "BackWide.Total", "Count"}) {
+      record.measuredResults.push_back(
+          judgeResult(QZMeasuredResult(name, Measurement(1, QZDimensionlessUnit::frames()))));
+    }
+    const std::string text = errorOfLimitWithoutResult(limitFrom(limit), {record})->localizedDescription();
+    const std::size_t end = text.find("; did you mean ");
+    return end == std::string::npos ? std::string() : text.substr(end);
+  };
+  EXPECT_EQ(suggestionFor("*.Totals > 0"), "; did you mean '*.Total'?");
+  EXPECT_EQ(suggestionFor("Totals > 0"), "; did you mean '*.Total'?");
+  EXPECT_EQ(suggestionFor("BackTeel.* > 0"), "; did you mean 'BackTele.*'?");
+  EXPECT_EQ(suggestionFor("BackW*.Ofset > 0"), "");  // that would fit nothing either
+  EXPECT_EQ(suggestionFor("Counts > 0"), "; did you mean 'Count'?");
+  EXPECT_EQ(suggestionFor("*.*.Total > 0"), "");
+}
+
 TEST(LimitWithoutResult, HasAnErrorThatNamesWhatIsNear) {
   const std::vector<DiagnosticRecord> records = {limitedRecord({measured("BackTele.Total", 1)}, {})};
   EXPECT_EQ(errorOfLimitWithoutResult(limitFrom("BackTele.Totl > 0"), records)->localizedDescription(),

@@ -15,11 +15,16 @@ namespace quazor {
 
 namespace {
 
+struct RepeatedValue {
+  double value = 0;
+  std::uint64_t repetition = 0;
+};
+
 // All values of one result.
 struct Series {
   std::string name;
   std::string unit;
-  std::vector<double> values;
+  std::vector<RepeatedValue> values;
   std::optional<QZLimit> limit;
   std::vector<UserLimit> userLimits;
 };
@@ -31,10 +36,10 @@ class SeriesOfDiagnostic {
   void add(const DiagnosticRecord& record) {
     std::map<std::string, std::size_t> seen;
     if (record.experimentOnly) {
-      for (const auto& [name, measurement] : record.measurements) seriesFor(seen, name, measurement);
+      for (const auto& [name, measurement] : record.measurements) seriesFor(seen, name, measurement, record);
     }
     for (const JudgedResult& one : record.measuredResults) {
-      Series& series = seriesFor(seen, one.result.name(), one.result.measurement());
+      Series& series = seriesFor(seen, one.result.name(), one.result.measurement(), record);
       if (!series.limit) series.limit = one.result.limit();
       series.userLimits = limitsFitting(one.result.name(), record.limits);
     }
@@ -46,12 +51,13 @@ class SeriesOfDiagnostic {
   using Key = std::tuple<std::string, std::size_t, std::string>;
 
   // The series of the measurement, which is added to it.
-  Series& seriesFor(std::map<std::string, std::size_t>& seen, const std::string& name, const Measurement& measurement) {
+  Series& seriesFor(std::map<std::string, std::size_t>& seen, const std::string& name, const Measurement& measurement,
+                    const DiagnosticRecord& record) {
     const std::string& unit = measurement.unit().symbol();
     const auto [place, isNew] = places_.emplace(Key{name, seen[name]++, unit}, series_.size());
     if (isNew) series_.push_back({name, unit, {}, std::nullopt, {}});
     Series& series = series_[place->second];
-    series.values.push_back(measurement.value());
+    series.values.push_back({measurement.value(), record.trial.repetition});
     return series;
   }
 
@@ -63,23 +69,29 @@ bool isSame(double one, double other) { return one == other || (std::isnan(one) 
 
 bool varies(const Series& series) {
   return std::any_of(series.values.begin(), series.values.end(),
-                     [&series](double one) { return !isSame(one, series.values.front()); });
+                     [&series](const RepeatedValue& one) { return !isSame(one.value, series.values.front().value); });
 }
 
 VaryingResult summaryOf(const Series& series) {
   constexpr double kNone = std::numeric_limits<double>::quiet_NaN();
-  VaryingResult result{series.name, series.unit, series.values.size(), kNone,
-                       kNone,       kNone,       series.limit,         series.userLimits};
-  std::vector<double> finite;
+  VaryingResult result{series.name, series.unit,  series.values.size(), kNone, kNone, kNone, 0,
+                       0,           series.limit, series.userLimits};
+  std::vector<RepeatedValue> finite;
   std::copy_if(series.values.begin(), series.values.end(), std::back_inserter(finite),
-               [](double one) { return std::isfinite(one); });
+               [](const RepeatedValue& one) { return std::isfinite(one.value); });
   if (finite.empty()) return result;
-  std::sort(finite.begin(), finite.end());
+  std::stable_sort(finite.begin(), finite.end(),
+                   [](const RepeatedValue& a, const RepeatedValue& b) { return a.value < b.value; });
   const std::size_t middle = finite.size() / 2;
   const bool isOdd = finite.size() % 2 == 1;
-  result.minimum = finite.front();
-  result.maximum = finite.back();
-  result.median = isOdd ? finite[middle] : finite[middle - 1] / 2 + finite[middle] / 2;  // their sum may overflow
+  result.minimum = finite.front().value;
+  result.minimumRepetition = finite.front().repetition;
+  result.maximum = finite.back().value;
+  const auto first = std::find_if(finite.begin(), finite.end(),
+                                  [&result](const RepeatedValue& one) { return one.value == result.maximum; });
+  result.maximumRepetition = first->repetition;
+  // The sum of two values may overflow.
+  result.median = isOdd ? finite[middle].value : finite[middle - 1].value / 2 + finite[middle].value / 2;
   return result;
 }
 
@@ -95,9 +107,10 @@ void count(VerdictCounts& counts, const DiagnosticRecord& record) {
 
 }  // namespace
 
-VerdictCounts verdictCountsOf(const std::vector<DiagnosticRecord>& records) {
+VerdictCounts verdictCountsOf(const std::vector<DiagnosticRecord>& records, std::optional<std::uint64_t> repetition) {
   VerdictCounts counts;
   for (std::size_t i = 0; i < records.size(); ++i) {
+    if (repetition && records[i].trial.repetition != *repetition) continue;
     if (!hasLaterAttempt(records, i)) count(counts, records[i]);
   }
   return counts;

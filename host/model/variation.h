@@ -4,6 +4,7 @@
 #include "host/model/diagnostic_record.h"
 
 #include <cstddef>
+#include <cstdint>
 #include <optional>
 #include <string>
 #include <vector>
@@ -21,10 +22,13 @@ struct VerdictCounts {
   std::size_t all() const { return passed + flaky + failed + errors + skipped; }
 };
 
-VerdictCounts verdictCountsOf(const std::vector<DiagnosticRecord>& records);
+// Of all records, or of one repetition.
+VerdictCounts verdictCountsOf(const std::vector<DiagnosticRecord>& records,
+                              std::optional<std::uint64_t> repetition = std::nullopt);
 
 // A result, or a measurement of an experiment on its own, whose value was not the same every time. The least, middle
-// and greatest value are those of the finite values; they are not a number if there is none.
+// and greatest value are those of the finite values; they are not a number if there is none, and then the repetitions
+// are 0.
 struct VaryingResult {
   std::string name;
   std::string unit;
@@ -32,6 +36,8 @@ struct VaryingResult {
   double minimum = 0;
   double median = 0;
   double maximum = 0;
+  std::uint64_t minimumRepetition = 0;  // the first with that value
+  std::uint64_t maximumRepetition = 0;
   std::optional<QZLimit> limit;       // the first that it had
   std::vector<UserLimit> userLimits;  // those of the user that fit it
 };

@@ -64,6 +64,15 @@ TEST(Variation, HasTheMedianOfEvenAndOddNumbers) {
   EXPECT_EQ(varyingOf({5, 5, 5}).values, 0U);  // never varied
 }
 
+TEST(Variation, HasTheFirstRepetitionsOfMinimumAndMaximum) {
+  const VaryingResult some = varyingOf({2, 1, 3, 1, std::nan(""), 3});
+  EXPECT_EQ(some.minimumRepetition, 2U);
+  EXPECT_EQ(some.maximumRepetition, 3U);
+  EXPECT_EQ(varyingOf({7, 7, 6}).minimumRepetition, 3U);
+  EXPECT_EQ(varyingOf({7, 7, 6}).maximumRepetition, 1U);
+  EXPECT_EQ(varyingOf({std::nan(""), HUGE_VAL}).minimumRepetition, 0U);
+}
+
 TEST(Variation, LeavesOutValuesThatAreNotFinite) {
   const double nan = std::nan("");
   const VaryingResult some = varyingOf({nan, 2, HUGE_VAL, 4});

@@ -75,8 +75,8 @@ std::string_view nounOf(Wanted wanted) {
     throw CommandError(ExitCode::kUsage, subject + " is " + rest);
   }
   if (isPattern(name)) throw CommandError(ExitCode::kUsage, "no " + noun + " matches " + quoted);
-  throw CommandError(ExitCode::kUsage,
-                     "there is no " + noun + " " + quoted + didYouMean(name, namesOf(reachable(catalogue, wanted))));
+  throw CommandError(ExitCode::kUsage, "there is no " + noun + " " + quoted +
+                                           didYouMeanOrPattern(name, namesOf(reachable(catalogue, wanted))));
 }
 
 bool failNothingMade(const std::string& name, DiagnosticErrorPtr* error) {

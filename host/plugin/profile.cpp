@@ -4,8 +4,10 @@
 #include "base/text/input_error.h"
 #include "host/plugin/diagnostic_registry.h"
 
+#include <algorithm>
 #include <cstdint>
 #include <optional>
+#include <system_error>
 #include <utility>
 
 namespace quazor {
@@ -14,6 +16,7 @@ namespace {
 
 constexpr std::uint64_t kSchema = 1;
 
+constexpr std::string_view kBase = "base";
 constexpr std::string_view kDiagnostics = "diagnostics";
 constexpr std::string_view kExperiments = "experiments";
 
@@ -108,8 +111,11 @@ Profile profileOf(const std::filesystem::path& file, JsonDocument json) {
   profile.document = std::make_shared<const JsonDocument>(std::move(json));
   FirstMistake& mistakes = profile.mistakes;
   const JsonCursor document(*profile.document);
-  mistakes.of([&] { document.allowKeys({"schema", kDiagnostics, kExperiments}); });
+  mistakes.of([&] { document.allowKeys({"schema", kBase, kDiagnostics, kExperiments}); });
   mistakes.of([&] { document.at("schema").integer(kSchema, kSchema); });
+  mistakes.of([&] {
+    if (const std::optional<JsonCursor> base = document.find(kBase)) profile.base = base->text();
+  });
   mistakes.of([&] {
     mistakes.inOrder(document.at(kDiagnostics).entries(),
                      [&profile](const auto& entry) { addEntry(entry.first, entry.second, profile); });
@@ -127,6 +133,27 @@ Profile profileOf(const std::filesystem::path& file, JsonDocument json) {
 Profile withoutMistakes(Profile profile) {
   profile.mistakes.throwIfAny();
   return profile;
+}
+
+// Empty if the profile has no base. `read` are the files of the profile and of those that are based on it.
+std::filesystem::path fileOfBase(const Profile& profile, const std::vector<std::filesystem::path>& read,
+                                 const ProfileSource& source) {
+  if (profile.base.empty()) return {};
+  const auto fail = [&profile](const std::string& sentence) {
+    profile.document->fail(std::string(kBase), inQuotes(profile.base) + sentence, std::string(kBase));
+  };
+  std::error_code ignored;
+  std::filesystem::path beside = (profile.file.parent_path() / profile.base).lexically_normal();
+  if (!std::filesystem::is_regular_file(beside, ignored)) {
+    std::filesystem::path named = source(profile.base, read);
+    if (named.empty()) fail(" is neither a file nor the name of another profile; 'quazor doctor' lists the profiles.");
+    return named;
+  }
+  for (const std::filesystem::path& one : read) {
+    if (!std::filesystem::equivalent(one, beside, ignored)) continue;
+    fail(" is itself based on this file; profiles must not be based on each other in a circle.");
+  }
+  return beside;
 }
 
 }  // namespace
@@ -156,9 +183,25 @@ std::string Profile::pathOf(const ProfileEntry& entry, Part part, std::string_vi
   return jsonPath(entry.ofExperiment ? path : jsonPath(path, nameOf(part)), parameter);
 }
 
-Profile readProfile(const std::filesystem::path& file) { return withoutMistakes(readProfileToCheck(file)); }
-
 Profile readProfileToCheck(const std::filesystem::path& file) { return profileOf(file, JsonDocument::read(file)); }
+
+std::vector<Profile> readProfileAndBases(const std::filesystem::path& file, const ProfileSource& source) {
+  std::vector<Profile> profiles;
+  std::vector<std::filesystem::path> read;
+  for (std::filesystem::path next = file; !next.empty();) {
+    read.push_back(next);
+    profiles.push_back(readProfileToCheck(next));
+    next = fileOfBase(profiles.back(), read, source);
+  }
+  std::reverse(profiles.begin(), profiles.end());
+  return profiles;
+}
+
+std::vector<UserLimit> limitsOf(const std::vector<Profile>& profiles) {
+  std::vector<UserLimit> limits;
+  for (const Profile& one : profiles) limits.insert(limits.end(), one.limits.begin(), one.limits.end());
+  return limits;
+}
 
 Profile parseProfile(const std::filesystem::path& file, const std::string& text) {
   return withoutMistakes(profileOf(file, JsonDocument(text, file.string())));

@@ -2,6 +2,7 @@
 //
 //   {
 //     "schema": 1,
+//     "base": "default",
 //     "diagnostics": {
 //       "CameraSyncDiagnostic.*": {
 //         "experiment": {"duration": 3},
@@ -13,7 +14,8 @@
 //   }
 //
 // The name of an entry is that of a diagnostic or an experiment, or a pattern (*, ?, [...]) for several. "experiments"
-// is optional; its values apply to experiments that run on their own. A limit (host/limits/user_limit.h) does not name
+// is optional; its values apply to experiments that run on their own. "base" is optional, too: another profile, whose
+// values and limits count besides, and whose values count less. A limit (host/limits/user_limit.h) does not name
 // its diagnostic; its name and its severity, "fail" by default, are optional.
 #pragma once
 
@@ -23,6 +25,7 @@
 #include "host/limits/user_limit.h"
 
 #include <filesystem>
+#include <functional>
 #include <memory>
 #include <string>
 #include <vector>
@@ -52,6 +55,7 @@ struct Profile {
   std::vector<ProfileEntry> experiments{};  // in the order of the file; without values for an analysis
   std::string kind = "profile";             // a user-readable name of the kind of file
   std::vector<UserLimit> limits{};          // in the order of the file
+  std::string base{};                       // as the file has it; empty: none
   bool mayNameOthers = false;               // an entry may name a diagnostic that no loaded plug-in has
   // The text of the file, for the lines of mistakes; null for values that do not come from a profile.
   std::shared_ptr<const JsonDocument> document{};
@@ -74,15 +78,25 @@ struct Profile {
                                  std::string_view parameter) const;
 };
 
-// Reads a profile of at most 16 MiB. Throws InputError with the file, the line and the place if it cannot be read or
-// does not have the form above.
-Profile readProfile(const std::filesystem::path& file);
-
-// Like readProfile(), but keeps mistakes of the form in Profile::mistakes, so that checkProfile() can throw the one
-// that comes first in the file. What is wrong is left out of the profile.
+// Reads a profile of at most 16 MiB. Throws InputError with the file and the line if it cannot be read. Keeps mistakes
+// of the form in Profile::mistakes, so that checkProfile() can throw the one that comes first in the file. What is
+// wrong is left out of the profile.
 Profile readProfileToCheck(const std::filesystem::path& file);
 
-// Like readProfile(), from the text of the file.
+// Finds the file of a profile that others are based on by its name, but none of those files; empty if there is none.
+using ProfileSource =
+    std::function<std::filesystem::path(const std::string& name, const std::vector<std::filesystem::path>& others)>;
+
+// Like readProfileToCheck(), of the profile and of those that it is based on, each after its own base. A base is a file
+// relative to the profile's own or, if there is none, what `source` finds. Throws InputError for a base that does not
+// exist or is based on the profile itself.
+std::vector<Profile> readProfileAndBases(const std::filesystem::path& file, const ProfileSource& source);
+
+// The limits of these profiles, in their order.
+std::vector<UserLimit> limitsOf(const std::vector<Profile>& profiles);
+
+// The profile in the text of the file, without its base. Throws InputError with the file, the line and the place if it
+// does not have the form above.
 Profile parseProfile(const std::filesystem::path& file, const std::string& text);
 
 }  // namespace quazor

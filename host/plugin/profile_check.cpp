@@ -1,6 +1,7 @@
 #include "host/plugin/profile_check.h"
 
 #include "base/json/json_cursor.h"
+#include "contract/message_format.h"
 #include "host/error/exit_code.h"
 
 #include <algorithm>
@@ -140,6 +141,30 @@ std::vector<Diagnostic> diagnosticsToDescribe(const Profile& profile,
   for (const ProfileEntry& entry : profile.entries) addDiagnosticsToDescribe(entry, catalogue, undescribed);
   for (const ProfileEntry& entry : profile.experiments) addDiagnosticsToDescribe(entry, catalogue, undescribed);
   return undescribed;
+}
+
+std::vector<std::string> limitsForOtherValues(const Profile& profile, const std::vector<ResolvedDiagnostic>& selected) {
+  std::vector<std::string> sentences;
+  const auto compare = [&](const ProfileEntry& entry, Part part, const ResolvedParameter& now) {
+    const Value* const meant = entry.values(part).find(now.name);
+    if (meant == nullptr || !now.value || defaultText(*meant) == defaultText(*now.value)) return;
+    std::string sentence =
+        formatMessage("the limits of the %@ %@ for %@ are made for %@=%@, but it is %@ (%@)", profile.kind,
+                      profile.file.filename().string(), entry.name, now.name, *meant, *now.value, now.source);
+    if (!isAmong(sentences, sentence)) sentences.push_back(std::move(sentence));
+  };
+  for (const ProfileEntry& entry : profile.entries) {
+    const bool hasLimits = std::any_of(profile.limits.begin(), profile.limits.end(),
+                                       [&entry](const UserLimit& one) { return one.diagnostic == entry.name; });
+    if (!hasLimits) continue;
+    for (const ResolvedDiagnostic& one : selected) {
+      const Diagnostic& diagnostic = one.described.diagnostic;
+      if (diagnostic.experimentOnly || !matchesName(entry.name, diagnostic.name)) continue;
+      for (const ResolvedParameter& now : one.parameters.experiment) compare(entry, Part::kExperiment, now);
+      for (const ResolvedParameter& now : one.parameters.analysis) compare(entry, Part::kAnalysis, now);
+    }
+  }
+  return sentences;
 }
 
 }  // namespace quazor

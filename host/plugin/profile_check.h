@@ -4,6 +4,7 @@
 #include "host/plugin/parameters.h"
 #include "host/plugin/profile.h"
 
+#include <string>
 #include <vector>
 
 namespace quazor {
@@ -18,5 +19,9 @@ void checkProfile(const Profile& profile, const std::vector<DescribedDiagnostic>
 // with a parameter that no described match declares.
 std::vector<Diagnostic> diagnosticsToDescribe(const Profile& profile,
                                               const std::vector<DescribedDiagnostic>& catalogue);
+
+// A sentence for each value that an entry of the profile gives beside its limits, if a selected diagnostic that these
+// limits judge runs with another one: they may not suit it.
+std::vector<std::string> limitsForOtherValues(const Profile& profile, const std::vector<ResolvedDiagnostic>& selected);
 
 }  // namespace quazor

@@ -118,7 +118,7 @@ TEST(Profile, FindsTheValueForAnExperiment) {
 }
 
 TEST(ReadProfile, RefusesWhatIsNotAFileOfAProfilesSize) {
-  const auto problemOf = [](const char* file) { return thrownText<InputError>([&] { readProfile(file); }); };
+  const auto problemOf = [](const char* file) { return thrownText<InputError>([&] { readProfileToCheck(file); }); };
   EXPECT_EQ(problemOf("/nowhere/p.json"), "/nowhere/p.json: the file does not exist.");
   EXPECT_EQ(problemOf("/"), "/: this is a directory, not a file.");
   EXPECT_EQ(problemOf("/dev/zero"), "/dev/zero: the file is larger than 16 MiB.");

@@ -6,6 +6,7 @@
 #include "host/error/exit_code.h"
 #include "host/model/record_builder.h"
 #include "host/record/lossless_json.h"
+#include "host/record/record_place.h"
 #include "host/record/run_event_json.h"
 #include "host/system/own_descriptor.h"
 
@@ -321,6 +322,7 @@ StoredRecord readRecord(const std::filesystem::path& file, const std::function<v
 }
 
 RecordedRun runIn(const std::filesystem::path& file) {
+  refuseFolderAsRecord(file);
   StoredRecord stored = readRecord(file);
   RecordedRun run;
   RecordBuilder builder;

@@ -96,7 +96,7 @@ struct RecordedRun {
   std::vector<std::vector<RecordedStream>> streams{};  // those of each of the records
 };
 
-// The run in a record, which may be incomplete. Throws like readRecord().
+// The run in a record, which may be incomplete. Throws like readRecord() and, for a folder, refuseFolderAsRecord().
 RecordedRun runIn(const std::filesystem::path& file);
 
 }  // namespace quazor

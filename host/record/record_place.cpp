@@ -4,6 +4,7 @@
 #include "host/text/timestamp.h"
 
 #include <algorithm>
+#include <cstddef>
 #include <set>
 #include <string>
 #include <string_view>
@@ -81,6 +82,19 @@ std::vector<fs::path> recordsIn(const std::vector<fs::path>& given) {
     for (const fs::path& file : recordsInFolder(one)) add(file);
   }
   return records;
+}
+
+void refuseFolderAsRecord(const fs::path& given) {
+  constexpr std::size_t kMaxListed = 3;
+  std::error_code ignored;
+  if (!fs::is_directory(given, ignored)) return;
+  const std::vector<fs::path> records = recordsInFolder(given);
+  std::string list;
+  for (std::size_t i = 0; i < std::min(records.size(), kMaxListed); ++i) {
+    list += (i == 0 ? "" : ", ") + records[records.size() - 1 - i].string();
+  }
+  if (records.size() > kMaxListed) list += " and " + std::to_string(records.size() - kMaxListed) + " more";
+  refuseFolder(given, "is not a record; name one of the records in it: " + list);
 }
 
 }  // namespace quazor

@@ -24,4 +24,8 @@ void makeFolderOfRecords(const std::filesystem::path& folder);
 // that has none or cannot be read.
 std::vector<std::filesystem::path> recordsIn(const std::vector<std::filesystem::path>& given);
 
+// Throws a CommandError (kCannotRead) for a folder, where one record is to be read: it names the last records in it, or
+// says that there is none.
+void refuseFolderAsRecord(const std::filesystem::path& given);
+
 }  // namespace quazor

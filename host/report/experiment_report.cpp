@@ -150,7 +150,7 @@ void printExperiment(std::ostream& out, const DiagnosticRecord& record, TextStyl
   out << '\n';
 }
 
-void printExperimentSummary(std::ostream& out, const std::vector<DiagnosticRecord>& records) {
+void printExperimentSummary(std::ostream& out, const std::vector<DiagnosticRecord>& records, std::size_t notReached) {
   const VerdictCounts counts = verdictCountsOf(records);
   const bool isRepeated =
       std::any_of(records.begin(), records.end(), [](const DiagnosticRecord& one) { return one.trial.repetition > 0; });
@@ -158,6 +158,7 @@ void printExperimentSummary(std::ostream& out, const std::vector<DiagnosticRecor
       << counts.errors << " ended in an error";
   if (counts.skipped > 0) out << ", " << counts.skipped << " skipped";
   if (counts.flaky > 0) out << ", " << counts.flaky << " flaky";
+  if (notReached > 0) out << ", " << notReached << " not reached";
   out << '\n';
 }
 

@@ -5,6 +5,7 @@
 #include "host/model/diagnostic_record.h"
 #include "host/report/text_report.h"
 
+#include <cstddef>
 #include <ostream>
 #include <vector>
 
@@ -18,7 +19,8 @@ void printAuxiliaryData(std::ostream& out, const Dictionary& data, bool blocks);
 // Prints the measurements of one experiment as a table, its auxiliary data, its outcome and, for kError, the error.
 void printExperiment(std::ostream& out, const DiagnosticRecord& record, TextStyle style);
 
-// Prints one line with the number of experiments that returned a result and that did not.
-void printExperimentSummary(std::ostream& out, const std::vector<DiagnosticRecord>& records);
+// Prints one line with the number of experiments that returned a result, that did not, and that the run did not reach.
+void printExperimentSummary(std::ostream& out, const std::vector<DiagnosticRecord>& records,
+                            std::size_t notReached = 0);
 
 }  // namespace quazor

@@ -1,7 +1,9 @@
 #include "host/report/report_format.h"
 
 #include "base/text/nearest_name.h"
+#include "contract/message_format.h"
 #include "host/error/exit_code.h"
+#include "host/model/incomplete_run.h"
 #include "host/model/trials.h"
 #include "host/model/variation.h"
 #include "host/record/value_json.h"
@@ -17,7 +19,10 @@
 #include "host/text/table.h"
 
 #include <algorithm>
+#include <cstddef>
+#include <iterator>
 #include <sstream>
+#include <utility>
 
 namespace quazor {
 
@@ -26,7 +31,10 @@ namespace {
 std::string textReport(const RunStarted& run, const std::vector<DiagnosticRecord>& records,
                        const std::optional<std::string>& interrupted, const TextContent& content) {
   std::ostringstream text;
-  for (const DiagnosticRecord& record : records) printReport(text, run, record, {false, false, content.verbose});
+  for (std::size_t i = 0; i < records.size(); ++i) {
+    printReport(text, run, records[i], {false, false, content.verbose});
+    if (!content.verbose) printRepetitionEnd(text, records, i + 1);
+  }
   printEnd(text, run, records, interrupted, content, false);
   if (interrupted && !interrupted->empty()) {
     text << "Interrupted while " << printable(*interrupted) << " was running.\n";
@@ -54,17 +62,51 @@ std::optional<Format> formatNamed(std::string_view name) {
   return std::nullopt;
 }
 
+namespace {
+
+// "report.xml:junit": the format is behind the file. A file of such a name can be given as "./report.xml:junit".
+void refuseSwapped(const std::string& text, Format usual) {
+  const std::size_t colon = text.rfind(':');
+  if (colon == std::string::npos || colon == 0 || text.starts_with("./")) return;
+  const std::string format = text.substr(colon + 1);
+  if (!formatNamed(format)) return;
+  throw CommandError(ExitCode::kUsage,
+                     formatMessage("--output '%@': the format comes first, as in --output %@:%@ (for a file of this "
+                                   "name, write '%@:%@')",
+                                   text, format, text.substr(0, colon), nameOf(usual), text));
+}
+
+}  // namespace
+
 OutputRequest parseOutput(const std::string& text, Format usual) {
   const std::size_t colon = text.find(':');
   const std::string word = text.substr(0, colon);
   const bool isWord = !word.empty() && word.find_first_not_of("abcdefghijklmnopqrstuvwxyz") == std::string::npos;
+  if (const std::optional<Format> format = formatNamed(word); format && colon != std::string::npos) {
+    return {*format, text.substr(colon + 1)};
+  }
+  refuseSwapped(text, usual);
   if (colon == std::string::npos || !isWord) return {usual, text};
-  if (const std::optional<Format> format = formatNamed(word)) return {*format, text.substr(colon + 1)};
   std::vector<std::string> names;
   for (const Format format : kFormats) names.emplace_back(nameOf(format));
   throw CommandError(ExitCode::kUsage, "--output '" + text + "': unknown format '" + word +
                                            "' (for a file of this name, write './" + text + "')" +
                                            didYouMean(word, names));
+}
+
+std::optional<Format> otherFormatOfSuffix(const OutputRequest& output) {
+  constexpr std::pair<std::string_view, Format> kSuffixes[] = {{".txt", Format::kText},  {".log", Format::kText},
+                                                               {".json", Format::kJson}, {".jsonl", Format::kOcp},
+                                                               {".csv", Format::kCsv},   {".xml", Format::kJunit}};
+  std::string suffix = output.file.extension().string();
+  std::transform(suffix.begin(), suffix.end(), suffix.begin(),
+                 [](char unit) { return unit >= 'A' && unit <= 'Z' ? static_cast<char>(unit - 'A' + 'a') : unit; });
+  const auto* const found = std::find_if(std::begin(kSuffixes), std::end(kSuffixes),
+                                         [&suffix](const auto& one) { return one.first == suffix; });
+  if (found == std::end(kSuffixes) || found->second == output.format) return std::nullopt;
+  // Each line of an OCP report is JSON.
+  if (output.format == Format::kOcp && found->second == Format::kJson) return std::nullopt;
+  return found->second;
 }
 
 std::string reportText(Format format, const RunStarted& run, const std::vector<DiagnosticRecord>& records,
@@ -93,7 +135,7 @@ void printReport(std::ostream& out, const RunStarted& run, const DiagnosticRecor
     printExperiment(out, record, style);
   } else if (style.verbose) {
     printRecord(out, record, style.colour);
-  } else {
+  } else if (!isOnlyCounted(record)) {
     std::size_t nameWidth = 0;
     for (const std::string& name : run.names) nameWidth = std::max(nameWidth, widthOf(printable(name)));
     printShortRecord(out, record, style.colour, nameWidth);
@@ -102,9 +144,13 @@ void printReport(std::ostream& out, const RunStarted& run, const DiagnosticRecor
 
 void printEnd(std::ostream& out, const RunStarted& run, const std::vector<DiagnosticRecord>& records,
               const std::optional<std::string>& interrupted, const TextContent& text, bool colour) {
+  const bool endsWithRepetition =
+      !records.empty() && !text.verbose && !run.ofExperiments && records.back().trial.repetition > 0;
+  if (endsWithRepetition) out << '\n';
   printVariation(out, records);
   if (records.size() != 1 || interrupted) {
-    run.ofExperiments ? printExperimentSummary(out, records) : printSummary(out, records);
+    const std::size_t notReached = interrupted ? unrecordedDiagnosticsOf(run, records, interrupted).neverRun.size() : 0;
+    run.ofExperiments ? printExperimentSummary(out, records, notReached) : printSummary(out, records, notReached);
   }
   const bool hasFlaky = verdictCountsOf(records).flaky > 0;
   if (hasFlaky && !run.acceptFlaky)

@@ -29,8 +29,11 @@ struct OutputRequest {
 };
 
 // [FORMAT:]FILE; the default format is `usual`. Throws a CommandError (kUsage) if the word before a colon is not a
-// format.
+// format, or for FILE:FORMAT.
 OutputRequest parseOutput(const std::string& text, Format usual);
+
+// The format that the suffix of the file suggests, if the report has another; nothing for other suffixes.
+std::optional<Format> otherFormatOfSuffix(const OutputRequest& output);
 
 // What the text reports of a run show.
 struct TextContent {
@@ -43,7 +46,7 @@ struct TextContent {
 std::string reportText(Format format, const RunStarted& run, const std::vector<DiagnosticRecord>& records,
                        const std::optional<std::string>& interrupted, const TextContent& text = {});
 
-// Prints the text report of one record of the run.
+// Prints the text report of one record of the run; nothing if that report only counts it (variation_report.h).
 void printReport(std::ostream& out, const RunStarted& run, const DiagnosticRecord& record, TextStyle style);
 
 // Prints the end of the text report: the number of records per verdict, unless there is only one and the run was not

@@ -52,6 +52,9 @@ TEST(ParseOutput, TakesAFormatBeforeAColon) {
       {"json:", Format::kJson, ""},
       {"./json:report", Format::kCsv, "./json:report"},
       {":report", Format::kCsv, ":report"},
+      {":json", Format::kCsv, ":json"},
+      {"./a:json", Format::kCsv, "./a:json"},
+      {"text:a:json", Format::kText, "a:json"},
   };
   for (const Row& row : kRows) {
     const OutputRequest request = parseOutput(row.text, Format::kCsv);
@@ -127,8 +130,10 @@ TEST_F(ReportTextTest, SaysWhichRunItWasInEveryFormatForPrograms) {
 TEST_F(ReportTextTest, CountsOneRecordOnlyWhenTheRunWasInterrupted) {
   records_.pop_back();
   EXPECT_THAT(report(Format::kText), testing::Not(HasSubstr("1 diagnostic")));
-  EXPECT_THAT(report(Format::kText, ""), EndsWith("1 diagnostic: 1 passed, 0 failed, 0 ended in an error\n"));
-  EXPECT_THAT(report(Format::kText, "B\n"), EndsWith("an error\nInterrupted while B\\x0a was running.\n"));
+  EXPECT_THAT(report(Format::kText, ""),
+              EndsWith("1 diagnostic: 1 passed, 0 failed, 0 ended in an error, 1 not reached\n"));
+  EXPECT_THAT(report(Format::kText, "B"), EndsWith("an error\nInterrupted while B was running.\n"));
+  EXPECT_THAT(report(Format::kText, "B\n"), EndsWith("\nInterrupted while B\\x0a was running.\n"));
   EXPECT_EQ(nlohmann::json::parse(report(Format::kJson, "B"))["interrupted"], "B");
 }
 

@@ -39,6 +39,7 @@ void RunReport::onEvent(const RunEvent& event) {
   } else if (const auto* const diagnostic = std::get_if<DiagnosticStarted>(&event)) {
     const auto place = std::find(run_.names.begin(), run_.names.end(), diagnostic->name);
     number_ = static_cast<std::size_t>(place - run_.names.begin()) + 1;
+    if (!records_.empty() && records_.back().trial.repetition != diagnostic->repetition) endRepetition();
     running_ = diagnostic->name + suffixOf(*diagnostic, run_);
     progress_.start(running_, expectedProgressOf(diagnostic->parameters));
   } else if (const auto* const logged = std::get_if<Logged>(&event)) {
@@ -58,7 +59,7 @@ void RunReport::onEvent(const RunEvent& event) {
 void RunReport::addRecord(DiagnosticRecord record) {
   progress_.stop();
   if (!options_.output.empty()) {
-    printVerdict(console_.out, record, console_.colour);
+    if (options_.text.verbose || !isOnlyCounted(record)) printVerdict(console_.out, record, console_.colour);
   } else if (options_.format == Format::kText) {
     printReport(console_.out, run_, record, {console_.colour, console_.blocks, options_.text.verbose});
   }
@@ -72,6 +73,12 @@ void RunReport::addRecord(DiagnosticRecord record) {
   }
   printUnfiredFaults(console_.err, record);
   records_.push_back(std::move(record));
+}
+
+void RunReport::endRepetition() {
+  if (options_.text.verbose || (options_.output.empty() && options_.format != Format::kText)) return;
+  printRepetitionEnd(console_.out, records_, records_.size());
+  console_.out.flush();
 }
 
 // The run does not wait for the reader of its heartbeats.
@@ -102,6 +109,7 @@ void RunReport::tellInterrupt(Stage stage, std::chrono::nanoseconds grace) {
 
 void RunReport::finishRun(const RunEnded& event) {
   progress_.stop();
+  endRepetition();
   const bool toFile = !options_.output.empty();
   const std::optional<std::string>& interrupted = event.interrupted;
   if (toFile || options_.format == Format::kText) {

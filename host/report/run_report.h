@@ -41,7 +41,8 @@ struct ReportOptions {
 };
 
 // The text report is printed after each diagnostic, all other formats at the end of the run. If the report goes to a
-// file, it is written at the end and the console shows one line per diagnostic.
+// file, it is written at the end and the console shows one line per diagnostic. What passes in a run with repetitions
+// is only counted, in a line for each repetition, unless the report is verbose.
 //
 // Thread: one at a time.
 class RunReport final : public RunEventSink {
@@ -65,6 +66,8 @@ class RunReport final : public RunEventSink {
 
  private:
   void tell(const Heartbeat& event);
+  // After the last record of a repetition.
+  void endRepetition();
   void finishRun(const RunEnded& event);
   void writeFile(const OutputRequest& output, const std::optional<std::string>& interrupted);
 

@@ -222,7 +222,7 @@ void printVerdict(std::ostream& out, const DiagnosticRecord& record, bool colour
   out << '\n';
 }
 
-void printSummary(std::ostream& out, const std::vector<DiagnosticRecord>& records) {
+void printSummary(std::ostream& out, const std::vector<DiagnosticRecord>& records, std::size_t notReached) {
   const VerdictCounts counts = verdictCountsOf(records);
   const bool isRepeated =
       std::any_of(records.begin(), records.end(), [](const DiagnosticRecord& one) { return one.trial.repetition > 0; });
@@ -230,6 +230,7 @@ void printSummary(std::ostream& out, const std::vector<DiagnosticRecord>& record
       << count(counts.failed, "failed") << ", " << count(counts.errors, "ended in an error");
   if (counts.skipped > 0) out << ", " << count(counts.skipped, "skipped");
   if (counts.flaky > 0) out << ", " << count(counts.flaky, "flaky");
+  if (notReached > 0) out << ", " << count(notReached, "not reached");
   if (const std::size_t warnings = warningsIn(records); warnings > 0) {
     out << ", " << count(warnings, warnings == 1 ? "warning" : "warnings");
   }

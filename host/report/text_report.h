@@ -52,8 +52,8 @@ void printResults(std::ostream& out, const DiagnosticRecord& record, ResultRows 
 void printVerdict(std::ostream& out, const DiagnosticRecord& record, bool colour, const std::string& more = {},
                   std::size_t nameWidth = 0);
 
-// Prints one line with the number of records per verdict.
-void printSummary(std::ostream& out, const std::vector<DiagnosticRecord>& records);
+// Prints one line with the number of records per verdict, and of those that the run did not reach.
+void printSummary(std::ostream& out, const std::vector<DiagnosticRecord>& records, std::size_t notReached = 0);
 
 // Prints each declared fault that never fired, because such a run says nothing about it.
 void printUnfiredFaults(std::ostream& out, const DiagnosticRecord& record);

@@ -1,6 +1,7 @@
 #include "host/report/variation_report.h"
 
 #include "contract/message_format.h"
+#include "host/model/limit_check.h"
 #include "host/model/trials.h"
 #include "host/model/variation.h"
 #include "host/record/value_json.h"
@@ -8,6 +9,7 @@
 #include "host/report/text_report.h"
 #include "host/text/table.h"
 
+#include <algorithm>
 #include <cstddef>
 #include <cstdint>
 #include <string_view>
@@ -45,14 +47,20 @@ Json countsJson(const VerdictCounts& counts) {
           {"skip", counts.skipped}};
 }
 
+Json repetitionJson(std::uint64_t repetition) { return repetition == 0 ? Json() : Json(repetition); }
+
+std::string repetitionText(std::uint64_t repetition) { return repetition == 0 ? "-" : std::to_string(repetition); }
+
 void printVarying(std::ostream& out, const std::vector<VaryingResult>& results) {
   using Align = Table::Align;
-  Table table({Align::kLeft, Align::kRight, Align::kRight, Align::kRight, Align::kRight, Align::kLeft, Align::kLeft});
-  table.addHeader({"Result", "Count", "Minimum", "Median", "Maximum", "Unit", "Limit"});
+  Table table({Align::kLeft, Align::kRight, Align::kRight, Align::kRight, Align::kRight, Align::kRight, Align::kRight,
+               Align::kLeft, Align::kLeft});
+  table.addHeader({"Result", "Count", "Minimum", "#", "Median", "Maximum", "#", "Unit", "Limit"});
   for (const VaryingResult& one : results) {
     const auto addRow = [&table, &one](const std::string& limit) {
-      table.addRow({printable(one.name), std::to_string(one.values), defaultText(one.minimum), defaultText(one.median),
-                    defaultText(one.maximum), printable(one.unit), limit});
+      table.addRow({printable(one.name), std::to_string(one.values), defaultText(one.minimum),
+                    repetitionText(one.minimumRepetition), defaultText(one.median), defaultText(one.maximum),
+                    repetitionText(one.maximumRepetition), printable(one.unit), limit});
     };
     addRow(limitText(one.limit));
     for (const UserLimit& limit : one.userLimits) addRow(printable(labelOf(limit)));
@@ -72,11 +80,30 @@ std::string trialText(const DiagnosticRecord& record) {
   return text + (passed ? "pass in " : "") + numberOf("attempt", attempt, attempts);
 }
 
+bool isOnlyCounted(const DiagnosticRecord& record) {
+  if (record.trial.repetition == 0 || record.experimentOnly) return false;
+  if (record.skip) return true;
+  const std::vector<LimitCheck> checks = limitChecksOf(record);
+  const bool isWarned = std::any_of(checks.begin(), checks.end(), [](const LimitCheck& one) { return !one.passed; });
+  return record.verdict == Verdict::kPass && !isFlaky(record) && !isWarned;
+}
+
+void printRepetitionEnd(std::ostream& out, const std::vector<DiagnosticRecord>& records, std::size_t end) {
+  if (end == 0 || records[end - 1].experimentOnly) return;
+  const Trial& last = records[end - 1].trial;
+  if (last.repetition == 0 || (end < records.size() && records[end].trial.repetition == last.repetition)) return;
+  out << numberOf("Repetition", last.repetition, last.repetitions) << ": "
+      << countsText(verdictCountsOf(records, last.repetition), false) << '\n';
+}
+
 void printVariation(std::ostream& out, const std::vector<DiagnosticRecord>& records) {
   const std::vector<DiagnosticVariation> variations = variationOf(records);
   if (variations.empty()) return;
   const bool ofExperiments = records.back().experimentOnly;
-  out << "What varied between the repetitions:\n";
+  const bool isAnyVarying = std::any_of(variations.begin(), variations.end(),
+                                        [](const DiagnosticVariation& one) { return !one.varying.empty(); });
+  out << "What varied between the repetitions"
+      << (isAnyVarying ? " (#: the first repetition with that value):\n" : ":\n");
   for (const DiagnosticVariation& one : variations) {
     out << printable(one.name) << ": " << countsText(one.verdicts, ofExperiments) << '\n';
     if (!one.varying.empty()) printVarying(out, one.varying);
@@ -100,6 +127,8 @@ Json variationJson(const std::vector<DiagnosticRecord>& records) {
                          {"minimum", numberJson(result.minimum)},
                          {"median", numberJson(result.median)},
                          {"maximum", numberJson(result.maximum)},
+                         {"minimumRepetition", repetitionJson(result.minimumRepetition)},
+                         {"maximumRepetition", repetitionJson(result.maximumRepetition)},
                          {"limit", limitJson(result.limit)}});
       for (const UserLimit& limit : result.userLimits) varying.back()["userLimits"].push_back(userLimitJson(limit));
     }

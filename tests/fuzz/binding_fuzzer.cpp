@@ -16,12 +16,35 @@ namespace {
 
 void requireSettings(const std::vector<ControlSetting>& settings) {
   for (const ControlSetting& one : settings) {
-    require(!one.control.empty() && one.control.size() <= 31, "a control has a name of V4L2");
+    require(!one.control.empty() && one.control.size() <= 63 + 1 + 31, "a control has a name of V4L2");
   }
 }
 
+void requirePad(const PadName& pad) {
+  require(!pad.entity.empty() && pad.entity.size() <= 63 && pad.pad <= 65535, "a pad has an entity");
+}
+
+void requireMedia(const MediaBinding& media) {
+  require(media.device.driver || media.device.model || media.device.busInfo, "a media controller is selected");
+  for (const LinkBinding& link : media.links) {
+    requirePad(link.source);
+    requirePad(link.sink);
+  }
+  for (const PadBinding& pad : media.pads) {
+    requirePad(pad.pad);
+    require(pad.format || pad.crop || pad.interval, "a pad has a setting");
+    require(!pad.format || (pad.format->code > 0 && pad.format->width > 0 && pad.format->height > 0),
+            "frames have a format and a size");
+    require(!pad.crop || (pad.crop->width > 0 && pad.crop->height > 0), "a crop leaves something");
+  }
+  const std::set<std::string> subdevices(media.subdevices.begin(), media.subdevices.end());
+  require(subdevices.size() == media.subdevices.size(), "a sub-device is named once");
+}
+
 void requireCamera(const CameraBinding& camera) {
-  require(camera.node.driver || camera.node.card || camera.node.busInfo, "a camera has a node");
+  const VideoNodeMatch& node = camera.node;
+  require(node.driver || node.card || node.busInfo || node.path || node.name, "a camera has a node");
+  if (camera.media) requireMedia(*camera.media);
   require(camera.width > 0 && camera.height > 0, "a camera has a size");
   require(camera.buffers >= 2 && camera.buffers <= 32, "a camera has as many buffers as V4L2 allows");
   requireSettings(camera.controls);

@@ -16,6 +16,7 @@ FRONT = ("Front", "FrontInfrared")
 CAPTURE, TELEMON = "QZCapturePlugInErrorDomain", "QZTelemonErrorDomain"
 LINUX = "LinuxErrorDomain"
 SYSTEM_CALL, NO_DEVICE, BUSY, DEVICE_GONE = 1, 2, 8, 9
+SINGLE_CAMERA, NOT_STARTED = "SingleCameraErrorDomain", 5
 HOST, NO_ERROR_GIVEN = "QuazorHostErrorDomain", 1
 
 
@@ -60,13 +61,14 @@ def healthy_again(step):
     healthy_run(step, "next", FRONT, 2.015)
 
 
-def as_the_kernel_counts(step, label, cameras):
-    """Checks that the counts of every camera equal the number of buffers dequeued until they were read."""
+def as_the_kernel_counts(step, label, cameras, ports=PORTS):
+    """Checks that the counts of every camera equal the number of buffers dequeued until they were read. `ports` has
+    the bus info of each camera."""
     entry = healthy_run(step, label, cameras, 3.015)
     trace = read_trace(step.text(f"{label}.trace"))
     minors = dict(line.split() for line in step.text(f"{label}.minors").splitlines())
     moment = trace.end_of_silence()
-    buffers = {camera: trace.dequeued_before(int(minors[PORTS[camera]]), moment) for camera in cameras}
+    buffers = {camera: trace.dequeued_before(int(minors[ports[camera]]), moment) for camera in cameras}
     master = buffers[cameras[0]][0].timestamp
     for camera in cameras:
         expect_equal(f"the frame count of {camera}", frames_of(entry, camera), len(buffers[camera]))
@@ -162,6 +164,24 @@ def two_users(step):
     healthy_run(step, "first", FRONT, 3.015)
     expect_not_controlled(step, "second", BUSY, "FrontFacingCamera")
     healthy_again(step)
+
+
+def media_controller(step):
+    linked = step.passed("linked")
+    frames = next(result["value"] for result in linked["measuredResults"] if result["name"] == "Frames")
+    expect(frames >= 140, f"there are only {frames} frames in 3 s at 50 a second")
+    expect(0 <= int(step.text("buffers")) - frames <= 1, f"the kernel counted {step.text('buffers')} buffers")
+    for label in ("bare_before", "bare_after"):  # its own links and formats do not fit together, before and after
+        below = underlying(step.ended_in_error(label, SINGLE_CAMERA, NOT_STARTED))
+        expect_equal("the cause", (below["domain"], below["code"]), (LINUX, SYSTEM_CALL))
+        expect("EPIPE" in below["message"] and '"media"' in below["message"], below["message"])
+    step.passed("again")
+    for way in ('"Sensor A"', '"Sensor B"', '"RGB/YUV Input", "Scaler"'):
+        expect(f"through a media controller, from {way};" in step.out("probe"), f"the probe finds no way from {way}")
+    as_probed = step.ran("as_probed")
+    expect(as_probed["error"] is None, f"what was probed does not run: {as_probed['error']}")
+    for camera in range(3):
+        step.passed(f"probed_{camera}")
 
 
 def projector(step):

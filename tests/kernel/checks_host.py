@@ -52,6 +52,13 @@ def probed_cameras(step):
     expect_equal("the verdict while frames are dropped", dropping["verdict"], "fail")
 
 
+def multiplanar_cameras(step):
+    planes = step.text("multiplanar").strip().split(",")[:5]
+    expect_equal("the kind of the cameras", planes, ["2"] * 5)
+    expect("NM16" in step.out("probe"), "no camera has a format with two planes")
+    probed_cameras(step)
+
+
 def channels(step):
     expect_equal("the number of channels", len(step.passed("complete")["measuredResults"]), 60)
     raised, missing = (path.rsplit("/", 1)[1] for path in step.text("chosen").splitlines())

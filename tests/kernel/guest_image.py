@@ -55,11 +55,19 @@ def system_archive(kernel):
     for directory in ("/proc", "/sys", "/dev", "/tmp", "/run", "/rig/out", "/rig/sanitizer"):
         archive.add_directory(directory)
     archive.add_character_device("/dev/console", 5, 1)
-    for module in kernel.modules:
-        archive.add_file(f"/rig/modules/{module.name}", module)
-    archive.add("/rig/modules/order", "".join(f"{module.name}\n" for module in kernel.modules).encode(), 0o644)
+    for group, modules in kernel.modules.items():
+        for module in modules:
+            archive.add_file(f"/rig/modules/{module.name}", module)
+        archive.add(f"/rig/modules/{group}", "".join(f"{module.name}\n" for module in modules).encode(), 0o644)
     options = " ".join(f"{name}={','.join(map(str, values))}" for name, values in VIVID_OPTIONS.items())
     archive.add("/rig/vivid_options", options.encode(), 0o644)
+    return archive.bytes()
+
+
+def module_archive(module):
+    """A module that a step loads itself, as bytes."""
+    archive = Archive()
+    archive.add_file(f"/rig/modules/{module.name}", module)
     return archive.bytes()
 
 
@@ -76,7 +84,7 @@ def project_archive(directory):
     archive.add("/rig/channels", channels_of(HERE.parent.parent / "data/scenarios/healthy.json").encode(), 0o644)
     archive.add("/etc/passwd", b"root::0:0::/:/bin/sh\nnobody::65534:65534::/:/bin/sh\n", 0o644)
     archive.add_file("/init", HERE / "guest/init")
-    for file in ("library", "step"):
+    for file in ("library", "step", "usb_projector.json"):
         archive.add_file(f"/rig/{file}", HERE / "guest" / file)
     for script in sorted((HERE / "guest/steps").glob("*.sh")):
         archive.add_file(f"/rig/steps/{script.stem}", script)

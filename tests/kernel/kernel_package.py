@@ -5,6 +5,7 @@ that the rig loads, in loading order.
 """
 
 import dataclasses
+import json
 import lzma
 import os
 import pathlib
@@ -14,7 +15,11 @@ import subprocess
 import tempfile
 
 META_PACKAGE = "linux-image-amd64"  # depends on the package of the newest kernel, whose name contains the version
-MODULES = ("hid-generic", "uhid", "bochs", "vivid")
+# Groups of modules, which steps load separately.
+MODULES = {
+    "devices": ("hid-generic", "uhid", "bochs", "vivid"),
+    "usb": ("vhci-hcd", "uvcvideo", "hid-generic", "usbhid"),
+}
 XZ_MAGIC = b"\xfd7zXZ\x00"
 
 
@@ -26,7 +31,7 @@ class KernelProblem(Exception):
 class Kernel:
     name: str  # of the package, with its version
     image: pathlib.Path
-    modules: tuple  # paths, each after its dependencies
+    modules: dict  # for each group of MODULES the paths, each after its dependencies
 
 
 def cache_directory(build):
@@ -36,11 +41,14 @@ def cache_directory(build):
 
 
 def kernel_of(directory):
-    """The kernel in a directory of the cache; None if the directory is incomplete."""
-    order = directory / "modules.order"
-    if not order.is_file():
+    """The kernel in a directory of the cache; None if the directory is incomplete or of an earlier list of modules."""
+    try:
+        order = json.loads((directory / "modules.json").read_text())
+    except FileNotFoundError:
         return None
-    modules = tuple(directory / "modules" / name for name in order.read_text().split())
+    if {group: tuple(kept["wanted"]) for group, kept in order.items()} != MODULES:
+        return None
+    modules = {group: tuple(directory / "modules" / name for name in kept["files"]) for group, kept in order.items()}
     return Kernel(directory.name, directory / "vmlinux", modules)
 
 
@@ -71,11 +79,10 @@ def unpacked_image(compressed):
     return lzma.LZMADecompressor().decompress(content[start:])
 
 
-def modules_in_order(root, release):
-    """The files of MODULES and of their dependencies, in loading order."""
-    output_of("depmod", "-b", root, release)
+def modules_in_order(root, release, wanted):
+    """The files of modules and of their dependencies, in loading order."""
     order = []
-    for module in MODULES:
+    for module in wanted:
         lines = output_of("modprobe", "-d", root, "-S", release, "--show-depends", module).splitlines()
         for file in (line.split()[1] for line in lines if line.startswith("insmod ")):
             if file not in order:
@@ -84,7 +91,7 @@ def modules_in_order(root, release):
 
 
 def extract(package, directory):
-    """Fills a directory of the cache from a package file. Writes `modules.order` last, as the mark of completeness."""
+    """Fills a directory of the cache from a package file. Writes `modules.json` last, as the mark of completeness."""
     with tempfile.TemporaryDirectory(dir=directory.parent) as scratch:
         root = pathlib.Path(scratch)
         output_of("dpkg-deb", "-x", package, root)
@@ -92,10 +99,14 @@ def extract(package, directory):
         release = compressed.name.removeprefix("vmlinuz-")
         (directory / "modules").mkdir(parents=True, exist_ok=True)
         (directory / "vmlinux").write_bytes(unpacked_image(compressed))
-        modules = modules_in_order(root, release)
-        for module in modules:
-            shutil.copy(module, directory / "modules")
-    (directory / "modules.order").write_text("\n".join(module.name for module in modules) + "\n")
+        output_of("depmod", "-b", root, release)
+        order = {}
+        for group, wanted in MODULES.items():
+            modules = modules_in_order(root, release, wanted)
+            for module in modules:
+                shutil.copy(module, directory / "modules")
+            order[group] = {"wanted": wanted, "files": [module.name for module in modules]}
+    (directory / "modules.json").write_text(json.dumps(order, indent=2) + "\n")
 
 
 def download(package, cache):

@@ -14,10 +14,12 @@ import threading
 import time
 
 from arrived import Arrived, CheckFailed
-from guest_image import (BuildProblem, build, plan_archive, project_archive, script_archive, system_archive)
+from guest_image import (BuildProblem, build, module_archive, plan_archive, project_archive, script_archive,
+                         system_archive)
 from kernel_package import KernelProblem, cache_directory, find_kernel
 from machine import boot, command_of
 from steps import STEPS, Step
+from vimc_module import find_vimc
 
 ROOT = pathlib.Path(__file__).resolve().parent.parent.parent
 RELEASE = ("-DCMAKE_BUILD_TYPE=Release",)
@@ -132,6 +134,13 @@ def run_plans(plans, kernel, results):
     return not any(plan.failed for plan in plans)
 
 
+def chosen_steps(names, thorough):
+    """The steps of these names, or all of them; the long ones only if asked for."""
+    if names:
+        return [step for step in STEPS if step.name in names]
+    return [step for step in STEPS if thorough or not step.thorough]
+
+
 def shell(command, directory, kernel):
     """Runs one command in a guest with all devices and prints its output; returns its exit code."""
     code = 1
@@ -166,6 +175,7 @@ def arguments():
                         help="build directory of what is run (default: build/release)")
     parser.add_argument("--sanitized", type=pathlib.Path, metavar="DIR",
                         help="run the steps also with this build, made with address and undefined-behaviour sanitizers")
+    parser.add_argument("--thorough", action="store_true", help="run the long steps, too")
     parser.add_argument("--no-build", action="store_true", help="take the builds as they are")
     parser.add_argument("--shell", metavar="COMMAND", help="run only this command in the guest, with all devices")
     parser.add_argument("--list", action="store_true", help="list the steps")
@@ -180,7 +190,7 @@ def arguments():
 def main():
     options = arguments()
     if options.list:
-        print("\n".join(f"{step.name:32} {step.shows}" for step in STEPS))
+        print("\n".join(f"{step.name:32} {step.shows}{' (--thorough)' if step.thorough else ''}" for step in STEPS))
         return 0
     began = time.monotonic()
     directory = options.build.resolve()
@@ -192,8 +202,10 @@ def main():
     if options.shell is not None:
         return shell(options.shell, directory, kernel)
     say(f"{kernel.name}; {time.monotonic() - began:.1f} s until here")
-    steps = [step for step in STEPS if not options.steps or step.name in options.steps]
+    steps = chosen_steps(options.steps, options.thorough)
     system = system_archive(kernel)
+    if any(step.needs_vimc for step in steps):
+        system += module_archive(find_vimc(kernel, say))
     plans = plans_of(steps, "boot", [system, project_archive(directory)], MEMORY, 1)
     if options.sanitized:
         long = [step.name for step in steps if step.soak and step.name not in options.steps]

@@ -150,6 +150,14 @@ class RigTest(unittest.TestCase):
         self.assertEqual(len(names), len(set(names)))
         self.assertEqual(sorted(names), sorted(script.stem for script in (HERE / "guest/steps").glob("*.sh")))
 
+    def test_the_long_steps_run_only_if_asked_for(self):
+        long = {step.name for step in STEPS if step.thorough}
+        self.assertTrue(long)
+        self.assertEqual({step.name for step in rig.chosen_steps([], False)}, {step.name for step in STEPS} - long)
+        self.assertEqual(rig.chosen_steps([], True), STEPS)
+        (name, *_) = long
+        self.assertEqual([step.name for step in rig.chosen_steps([name], False)], [name])
+
     def test_an_unknown_step_is_refused(self):
         original, sys.argv = sys.argv, ["run", "no_such_step"]
         try:

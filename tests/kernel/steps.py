@@ -6,6 +6,7 @@ import typing
 import checks_cameras as cameras
 import checks_host as host
 import checks_sensors as sensors
+import checks_usb as usb
 
 
 @dataclasses.dataclass(frozen=True)
@@ -16,6 +17,8 @@ class Step:
     boot: int = 1  # the boot in which it runs
     limit: int = 60  # seconds of guest time before it counts as hung
     soak: bool = False  # with sanitizers only when it is named: it takes minutes there
+    thorough: bool = False  # only with --thorough, or when it is named
+    needs_vimc: bool = False
 
 
 STEPS = [
@@ -38,6 +41,7 @@ STEPS = [
     Step("probe", "a probe lists what is there, also without rights", host.probe, boot=2),
     Step("probed_cameras", "the cameras pass as they were probed; what is not there is skipped", host.probed_cameras,
          boot=2),
+    Step("multiplanar_cameras", "the same with frames of several planes", host.multiplanar_cameras, boot=2),
     Step("projector", "frames are lit, and the light is off afterwards", cameras.projector, boot=2),
     Step("projector_unlit", "the light fails: error 206", cameras.projector_unlit, boot=2),
     Step("projector_unsafe", "the light is off for safety: error 213", cameras.projector_unsafe, boot=2),
@@ -45,5 +49,22 @@ STEPS = [
     Step("sensor_30s", "60 images a second for 30 s, without loss", sensors.sensor_30s, boot=2, limit=90, soak=True),
     Step("sensor_faults", "no sensor, two, silent, refusing, removed, pausing, with long reports",
          sensors.sensor_faults, boot=2),
+    Step("media_controller", "frames of vimc come through links and pads of the binding", cameras.media_controller,
+         boot=2, needs_vimc=True),
     Step("display_off", "no images while the display is dark or unplugged", sensors.display_off, boot=2),
+    Step("usb_camera", "a USB camera passes as probed; its frames are as the kernel counts them", usb.usb_camera, boot=3),
+    Step("usb_cameras", "five USB cameras pass as probed, to the frame", usb.usb_cameras, boot=3),
+    Step("usb_twins", "two cameras of one USB device pass", usb.usb_twins, boot=3),
+    Step("usb_stalled_controls", "controls that stall are told, and never reported as set", usb.usb_stalled_controls,
+         boot=3),
+    Step("usb_metadata", "a USB camera's metadata belong to its frames, whoever stamps them", usb.usb_metadata, boot=3),
+    Step("usb_damaged_frames", "damaged and short frames are gaps, or buffers with errors", usb.usb_damaged_frames,
+         boot=3),
+    Step("usb_late_frames", "late frames, and none, are noticed", usb.usb_late_frames, boot=3),
+    Step("usb_unplugged", "a USB camera is unplugged before, at the start, in and after a stream", usb.usb_unplugged,
+         boot=3),
+    Step("usb_unplugged_anytime", "a USB camera is unplugged at ten moments of a stream", usb.usb_unplugged_anytime,
+         boot=3, limit=120, thorough=True),
+    Step("usb_60s", "two USB cameras for 60 s, without loss", usb.usb_60s, boot=3, limit=120, soak=True, thorough=True),
+    Step("usb_sensor", "a USB sensor; one that stalls, is silent, pauses, is unplugged", usb.usb_sensor, boot=4),
 ]

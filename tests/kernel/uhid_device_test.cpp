@@ -25,7 +25,7 @@ using namespace std::chrono_literals;
 // A sensor on connected sockets; the test plays the kernel.
 class UhidDeviceTest : public ::testing::Test {
  protected:
-  void make(UhidSensorConfig traits) {
+  void make(DisplaySensorConfig traits) {
     std::array<int, 2> ends{-1, -1};
     ASSERT_EQ(::socketpair(AF_UNIX, SOCK_SEQPACKET | SOCK_CLOEXEC | SOCK_NONBLOCK, 0, ends.data()), 0);
     kernel_ = FileDescriptor(ends[0]);
@@ -36,7 +36,7 @@ class UhidDeviceTest : public ::testing::Test {
     created_ = *created;
   }
   void make() {
-    UhidSensorConfig traits;
+    DisplaySensorConfig traits;
     traits.rate = 100;
     make(traits);
   }
@@ -97,7 +97,7 @@ class UhidDeviceTest : public ::testing::Test {
 };
 
 TEST_F(UhidDeviceTest, TheKernelIsToldOfASensor) {
-  UhidSensorConfig traits;
+  DisplaySensorConfig traits;
   traits.name = std::string(200, 'n');
   make(traits);
   EXPECT_EQ(size_, static_cast<ssize_t>(sizeof(uhid_event)));
@@ -125,7 +125,7 @@ TEST_F(UhidDeviceTest, ImagesComeWhileItIsOpenAndBothModesAreOn) {
   EXPECT_EQ(frame(), 2U);
   EXPECT_EQ(frame(), 3U);
   EXPECT_EQ(frame(), std::nullopt);
-  EXPECT_EQ(sensor_->sent(), 3U);
+  EXPECT_EQ(sensor_->sensor().sent(), 3U);
   tell(UHID_CLOSE);
   EXPECT_EQ(sensor_->due(), std::nullopt);
   tell(UHID_OPEN, 2s);
@@ -135,7 +135,7 @@ TEST_F(UhidDeviceTest, ImagesComeWhileItIsOpenAndBothModesAreOn) {
 }
 
 TEST_F(UhidDeviceTest, ASensorMayAlwaysStream) {
-  UhidSensorConfig traits;
+  DisplaySensorConfig traits;
   traits.alwaysStreams = true;
   traits.rate = 1;
   make(traits);
@@ -145,7 +145,7 @@ TEST_F(UhidDeviceTest, ASensorMayAlwaysStream) {
 }
 
 TEST_F(UhidDeviceTest, ReportsHaveTheLengthThatIsAskedFor) {
-  UhidSensorConfig traits;
+  DisplaySensorConfig traits;
   traits.length = 4096;
   traits.images.firstFrameID = 5;
   make(traits);
@@ -156,7 +156,7 @@ TEST_F(UhidDeviceTest, ReportsHaveTheLengthThatIsAskedFor) {
 }
 
 TEST_F(UhidDeviceTest, FeatureReportsAreAnsweredRefusedOrIgnored) {
-  UhidSensorConfig traits;
+  DisplaySensorConfig traits;
   traits.refuses = {0xAB};
   traits.ignores = {0xAC};
   make(traits);
@@ -167,9 +167,9 @@ TEST_F(UhidDeviceTest, FeatureReportsAreAnsweredRefusedOrIgnored) {
   EXPECT_EQ(set(0xAD, 1, UHID_OUTPUT_REPORT), EIO);
   EXPECT_EQ(set(0xAD, 1, UHID_FEATURE_REPORT, 1), EIO);
   EXPECT_EQ(sensor_->due(), std::nullopt);
-  ASSERT_THAT(sensor_->features(), testing::SizeIs(5));
-  EXPECT_EQ(sensor_->features()[0].id, 0xAB);
-  EXPECT_THAT(sensor_->features()[0].data, testing::ElementsAre(0xAB, 1));
+  ASSERT_THAT(sensor_->sensor().features(), testing::SizeIs(5));
+  EXPECT_EQ(sensor_->sensor().features()[0].id, 0xAB);
+  EXPECT_THAT(sensor_->sensor().features()[0].data, testing::ElementsAre(0xAB, 1));
 }
 
 TEST_F(UhidDeviceTest, ReadsOfFeatureReportsAreRefusedAndOtherEventsPassedOver) {
@@ -188,18 +188,18 @@ TEST_F(UhidDeviceTest, ReadsOfFeatureReportsAreRefusedAndOtherEventsPassedOver) 
 }
 
 TEST_F(UhidDeviceTest, ASensorThatStopsSendsNoMore) {
-  UhidSensorConfig traits;
+  DisplaySensorConfig traits;
   traits.stopsAfter = 2;
   make(traits);
   turnOn();
   EXPECT_TRUE(sensor_->act(1s));
-  EXPECT_EQ(sensor_->sent(), 2U);
+  EXPECT_EQ(sensor_->sensor().sent(), 2U);
   EXPECT_EQ(sensor_->due(), std::nullopt);
-  EXPECT_FALSE(sensor_->isGone());
+  EXPECT_FALSE(sensor_->sensor().isGone());
 }
 
 TEST_F(UhidDeviceTest, ASensorThatIsRemovedSaysSoToTheKernelOnce) {
-  UhidSensorConfig traits;
+  DisplaySensorConfig traits;
   traits.removedAfter = 2;
   make(traits);
   turnOn();
@@ -209,7 +209,7 @@ TEST_F(UhidDeviceTest, ASensorThatIsRemovedSaysSoToTheKernelOnce) {
   const auto event = received();
   ASSERT_TRUE(event.has_value());
   EXPECT_EQ(event->type, std::uint32_t{UHID_DESTROY});
-  EXPECT_TRUE(sensor_->isGone());
+  EXPECT_TRUE(sensor_->sensor().isGone());
   sensor_->destroy();
   EXPECT_FALSE(received().has_value());
 }
@@ -222,7 +222,7 @@ TEST_F(UhidDeviceTest, WhatTheKernelRefusesIsTold) {
   kernel_.reset();
   ::signal(SIGPIPE, SIG_IGN);
   EXPECT_FALSE(sensor_->act(1s));
-  EXPECT_EQ(sensor_->sent(), 0U);
+  EXPECT_EQ(sensor_->sensor().sent(), 0U);
   EXPECT_FALSE(sensor_->create());
 }
 

@@ -60,7 +60,7 @@ class Node {
 };
 
 std::uint32_t capabilityOf(std::string_view kind) {
-  if (kind == "capture") return V4L2_CAP_VIDEO_CAPTURE;
+  if (kind == "capture") return V4L2_CAP_VIDEO_CAPTURE | V4L2_CAP_VIDEO_CAPTURE_MPLANE;
   if (kind == "metadata") return V4L2_CAP_META_CAPTURE;
   throw std::invalid_argument("the kind is \"capture\" or \"metadata\", not \"" + std::string(kind) + '"');
 }
@@ -91,8 +91,12 @@ std::uint32_t findControl(const Node& node, std::string_view name) {
   throw std::invalid_argument("the node has no control \"" + std::string(name) + '"');
 }
 
-v4l2_buf_type bufferTypeOf(std::string_view kind) {
-  return kind == "capture" ? V4L2_BUF_TYPE_VIDEO_CAPTURE : V4L2_BUF_TYPE_META_CAPTURE;
+v4l2_buf_type bufferTypeOf(const Node& node, std::string_view kind) {
+  if (kind != "capture") return V4L2_BUF_TYPE_META_CAPTURE;
+  v4l2_capability found{};
+  node.demand(VIDIOC_QUERYCAP, found, "VIDIOC_QUERYCAP");
+  const bool isSinglePlanar = (found.device_caps & V4L2_CAP_VIDEO_CAPTURE) != 0;
+  return isSinglePlanar ? V4L2_BUF_TYPE_VIDEO_CAPTURE : V4L2_BUF_TYPE_VIDEO_CAPTURE_MPLANE;
 }
 
 void perform(const std::vector<std::string>& words) {
@@ -104,7 +108,7 @@ void perform(const std::vector<std::string>& words) {
     std::cout << node.path().string() << '\n';
   } else if (action == "free" && words.size() == 3) {
     v4l2_format format{};
-    format.type = bufferTypeOf(words[1]);
+    format.type = bufferTypeOf(node, words[1]);
     node.demand(VIDIOC_G_FMT, format, "VIDIOC_G_FMT");
     node.demand(VIDIOC_S_FMT, format, "VIDIOC_S_FMT");
   } else if (action == "get" && words.size() == 4) {

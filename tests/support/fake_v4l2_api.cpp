@@ -7,19 +7,16 @@
 #include <cstring>
 #include <fstream>
 #include <iomanip>
+#include <stdexcept>
 #include <utility>
 
 namespace quazor {
 namespace {
 
-constexpr std::size_t kBufferSize = 64;
-
 template <class Field>
 void copyText(Field& field, const std::string& text) {
   std::memcpy(field, text.data(), std::min(text.size(), sizeof field));
 }
-
-bool isMetadata(const FakeNode& node) { return (node.capabilities & V4L2_CAP_META_CAPTURE) != 0; }
 
 const FakeSize* sizeOf(const FakeNode& node, std::uint32_t fourcc, std::uint32_t width, std::uint32_t height) {
   for (const FakeFormat& format : node.formats) {
@@ -56,7 +53,7 @@ class FakeV4l2Api::Guard final : public ControlGuard {
 
 FakeV4l2Api::FakeV4l2Api() {
   std::string folder = (std::filesystem::temp_directory_path() / "fake-video-XXXXXX").string();
-  ::mkdtemp(folder.data());
+  if (::mkdtemp(folder.data()) == nullptr) throw std::runtime_error("no directory for the fake kernel");
   roots_ = {std::filesystem::path(folder) / "sys", std::filesystem::path(folder) / "dev"};
 }
 
@@ -77,6 +74,7 @@ std::string FakeV4l2Api::add(int number, FakeNode node) {
     }
     std::filesystem::create_directory_symlink(device, folder / "device");
   }
+  makeDeviceFile(name, static_cast<std::uint32_t>(number));
   node.path = (roots_.dev / name).string();
   const std::lock_guard lock(mutex_);
   return nodes_.insert_or_assign(node.path, node).first->first;
@@ -97,24 +95,6 @@ bool FakeV4l2Api::faulty(const FakeNode& node, unsigned long request, int& numbe
   }
   number = fault.number;
   return fault.times-- > 0;
-}
-
-void FakeV4l2Api::fill(FakeNode& node, std::chrono::nanoseconds timestamp, std::uint32_t flags) {
-  const std::uint32_t sequence = node.sequence++;
-  if (!node.streaming || node.queued.empty() || node.gone || node.broken) return;
-  v4l2_buffer buffer{};
-  buffer.index = node.queued.front();
-  node.queued.pop_front();
-  buffer.sequence = sequence;
-  buffer.flags = flags | node.timestampFlags;
-  const auto seconds = std::chrono::duration_cast<std::chrono::seconds>(timestamp);
-  buffer.timestamp.tv_sec = seconds.count();
-  buffer.timestamp.tv_usec = std::chrono::duration_cast<std::chrono::microseconds>(timestamp - seconds).count();
-  buffer.bytesused = static_cast<std::uint32_t>(isMetadata(node) ? node.metadata.size() : kBufferSize);
-  for (auto& [address, mapping] : mappings_) {
-    if (isMetadata(node) && mapping.path == node.path) std::ranges::copy(node.metadata, mapping.memory.begin());
-  }
-  node.filled.push_back(buffer);
 }
 
 void FakeV4l2Api::produceLocked(FakeNode& node, std::uint32_t flags) {
@@ -222,6 +202,7 @@ void FakeV4l2Api::close(int descriptor) {
   if (events_.erase(descriptor) > 0) return;
   FakeNode& node = nodes_.at(descriptors_.at(descriptor));
   descriptors_.erase(descriptor);
+  tried_.erase(descriptor);
   if (node.lockedBy == descriptor) node.lockedBy = -1;
   if (node.owner == descriptor) {  // like the kernel; mapped buffers remain in use
     node.owner = -1;
@@ -256,8 +237,10 @@ int FakeV4l2Api::ioctl(int descriptor, unsigned long request, void* argument) {
 
 // Returns 0 or an error number.
 int FakeV4l2Api::call(FakeNode& node, int descriptor, unsigned long request, void* argument) {
+  if (node.media) return mediaCall(node, request, argument);
   switch (request) {
     case VIDIOC_QUERYCAP: {
+      if (node.isSubdevice) return ENOTTY;
       auto& capability = *static_cast<v4l2_capability*>(argument);
       copyText(capability.driver, node.driver);
       copyText(capability.card, node.card);
@@ -273,7 +256,10 @@ int FakeV4l2Api::call(FakeNode& node, int descriptor, unsigned long request, voi
     case VIDIOC_S_FMT: return format(node, request == VIDIOC_S_FMT, *static_cast<v4l2_format*>(argument));
     case VIDIOC_G_PARM:
     case VIDIOC_S_PARM: {
-      v4l2_fract& fraction = static_cast<v4l2_streamparm*>(argument)->parm.capture.timeperframe;
+      if (!node.hasIntervals) return ENOTTY;
+      auto& parameters = *static_cast<v4l2_streamparm*>(argument);
+      if (parameters.type != bufferTypeOf(node)) return EINVAL;
+      v4l2_fract& fraction = parameters.parm.capture.timeperframe;
       const FakeSize* size = sizeOf(node, node.format.pixelformat, node.format.width, node.format.height);
       if (request == VIDIOC_S_PARM && size != nullptr) {
         const double wanted = static_cast<double>(fraction.denominator) / fraction.numerator;
@@ -284,21 +270,19 @@ int FakeV4l2Api::call(FakeNode& node, int descriptor, unsigned long request, voi
       return 0;
     }
     case VIDIOC_REQBUFS: return requestBuffers(node, descriptor, *static_cast<v4l2_requestbuffers*>(argument));
-    case VIDIOC_QUERYBUF: {
-      auto& buffer = *static_cast<v4l2_buffer*>(argument);
-      buffer.length = kBufferSize;
-      buffer.m.offset = buffer.index * 4096;
-      return 0;
-    }
-    case VIDIOC_QBUF: node.queued.push_back(static_cast<v4l2_buffer*>(argument)->index); return 0;
+    case VIDIOC_QUERYBUF: return queryBuffer(node, *static_cast<v4l2_buffer*>(argument));
+    case VIDIOC_QBUF: return queue(node, *static_cast<v4l2_buffer*>(argument));
     case VIDIOC_DQBUF: return dequeue(node, *static_cast<v4l2_buffer*>(argument));
     case VIDIOC_STREAMON:
+      if (*static_cast<std::uint32_t*>(argument) != bufferTypeOf(node)) return EINVAL;
+      if (const int problem = streamProblem(node)) return problem;
       node.streaming = true;
       node.sequence = node.firstSequence;
       node.nextFrame = now_;
       node.history.emplace_back("STREAMON");
       return 0;
     case VIDIOC_STREAMOFF:
+      if (*static_cast<std::uint32_t*>(argument) != bufferTypeOf(node)) return EINVAL;
       node.streaming = node.broken = false;
       node.queued.clear();
       node.filled.clear();
@@ -307,50 +291,46 @@ int FakeV4l2Api::call(FakeNode& node, int descriptor, unsigned long request, voi
     case VIDIOC_G_EXT_CTRLS:
     case VIDIOC_S_EXT_CTRLS:
       return control(node, request == VIDIOC_S_EXT_CTRLS, *static_cast<v4l2_ext_controls*>(argument));
-    default: return enumerate(node, request, argument);
+    default:
+      return node.isSubdevice && request != VIDIOC_QUERY_EXT_CTRL ? subdeviceCall(node, descriptor, request, argument)
+                                                                  : enumerate(node, request, argument);
   }
 }
 
 int FakeV4l2Api::format(FakeNode& node, bool sets, v4l2_format& format) const {
+  if (format.type != bufferTypeOf(node)) return EINVAL;
   if (isMetadata(node)) {
     format.fmt.meta = node.metadataFormat;
     return 0;
   }
-  v4l2_pix_format& wanted = format.fmt.pix;
   if (sets && node.buffers > 0) return EBUSY;
-  if (sizeOf(node, wanted.pixelformat, wanted.width, wanted.height) == nullptr) {
-    wanted.width = node.formats.front().sizes.front().width;
-    wanted.height = node.formats.front().sizes.front().height;
-  }
-  if (sets) node.format = wanted;
-  return 0;
-}
-
-int FakeV4l2Api::requestBuffers(FakeNode& node, int descriptor, v4l2_requestbuffers& request) {
-  if (node.owner >= 0 && node.owner != descriptor) return EBUSY;
-  if (node.mapped > 0 || node.streaming) return EBUSY;
-  node.buffers = std::min(request.count, node.mostBuffers);
-  node.owner = node.buffers == 0 ? -1 : descriptor;
-  request.count = node.buffers;
-  return 0;
-}
-
-int FakeV4l2Api::dequeue(FakeNode& node, v4l2_buffer& buffer) {
-  if (node.broken) return EIO;
-  if (!node.streaming) return EINVAL;
-  if (node.filled.empty()) return EAGAIN;
-  buffer = node.filled.front();
-  node.filled.pop_front();
+  const auto apply = [&](auto& wanted) {
+    if (sizeOf(node, wanted.pixelformat, wanted.width, wanted.height) == nullptr) {
+      wanted.width = node.formats.front().sizes.front().width;
+      wanted.height = node.formats.front().sizes.front().height;
+    }
+    if (!sets) return;
+    node.format.pixelformat = wanted.pixelformat;
+    node.format.width = wanted.width;
+    node.format.height = wanted.height;
+  };
+  isMultiplanar(node) ? apply(format.fmt.pix_mp) : apply(format.fmt.pix);
   return 0;
 }
 
 int FakeV4l2Api::enumerate(const FakeNode& node, unsigned long request, void* argument) const {
   if (request == VIDIOC_ENUM_FMT) {
     auto& description = *static_cast<v4l2_fmtdesc*>(argument);
-    if (description.index >= node.formats.size()) return EINVAL;
-    description.pixelformat = node.formats[description.index].fourcc;
-    copyText(description.description, node.formats[description.index].description);
-    return 0;
+    if (description.type != bufferTypeOf(node)) return EINVAL;
+    std::uint32_t left = description.index;
+    for (const FakeFormat& format : node.formats) {
+      const bool isMeant = description.mbus_code == 0 || description.mbus_code == format.busCode;
+      if (!isMeant || left-- > 0) continue;
+      description.pixelformat = format.fourcc;
+      copyText(description.description, format.description);
+      return 0;
+    }
+    return EINVAL;
   }
   if (request == VIDIOC_ENUM_FRAMESIZES) {
     auto& entry = *static_cast<v4l2_frmsizeenum*>(argument);
@@ -410,28 +390,6 @@ int FakeV4l2Api::control(FakeNode& node, bool sets, v4l2_ext_controls& list) {
   return 0;
 }
 
-int FakeV4l2Api::map(int descriptor, std::size_t length, std::int64_t /*offset*/, void** address) {
-  const std::lock_guard lock(mutex_);
-  FakeNode& node = nodes_.at(descriptors_.at(descriptor));
-  if (failNextMaps > 0) {
-    --failNextMaps;
-    return -ENOMEM;
-  }
-  Mapping mapping{node.path, std::vector<std::uint8_t>(length)};
-  *address = mapping.memory.data();
-  mappings_.emplace(*address, std::move(mapping));
-  ++node.mapped;
-  return 0;
-}
-
-void FakeV4l2Api::unmap(void* address, std::size_t /*length*/) {
-  const std::lock_guard lock(mutex_);
-  FakeNode& node = nodes_.at(mappings_.at(address).path);
-  mappings_.erase(address);
-  --node.mapped;
-  if (node.mapped == 0 && node.owner < 0) node.buffers = 0;
-}
-
 std::unique_ptr<ControlGuard> FakeV4l2Api::guardControls(const std::string& path, int descriptor,
                                                          const std::vector<ControlValue>& off, int* number) {
   const std::lock_guard lock(mutex_);
@@ -448,6 +406,14 @@ FakeNode fakeCamera(const std::string& bus) {
   node.bus = bus;
   node.formats = {{fakeCode('Y', 'U', 'Y', 'V'), "YUYV 4:2:2", sizes},
                   {fakeCode('G', 'R', 'E', 'Y'), "8-bit grey", sizes}};
+  return node;
+}
+
+FakeNode fakeMultiplanarCamera(const std::string& bus) {
+  FakeNode node = fakeCamera(bus);
+  node.capabilities = V4L2_CAP_VIDEO_CAPTURE_MPLANE | V4L2_CAP_STREAMING;
+  node.formats[0].fourcc = fakeCode('N', 'M', '1', '2');
+  node.formats[1].fourcc = fakeCode('N', 'M', '1', '6');
   return node;
 }
 

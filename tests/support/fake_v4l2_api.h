@@ -4,9 +4,12 @@
 // a queue busy until every buffer is unmapped, provides fewer buffers than requested, and stamps frames in the future.
 #pragma once
 
+#include "backends/linux/media/media_graph.h"
 #include "backends/linux/video/v4l2_api.h"
 #include "backends/linux/video/v4l2_device_info.h"
+#include "tests/support/fake_media.h"
 
+#include <linux/v4l2-subdev.h>
 #include <linux/videodev2.h>
 
 #include <atomic>
@@ -46,6 +49,7 @@ struct FakeFormat {
   std::uint32_t fourcc = 0;
   std::string description;
   std::vector<FakeSize> sizes;
+  std::uint32_t busCode = 0;  // of the pads from which frames of the format can come
 };
 
 // One node. Tests set the members above the blank line; the driver sets those below.
@@ -60,6 +64,10 @@ struct FakeNode {
   std::vector<FakeFormat> formats;
   std::vector<FakeControl> controls;
   std::uint32_t mostBuffers = 32;
+  std::uint32_t planes = 2;  // of each buffer of a multi-planar node
+  bool hasIntervals = true;
+  bool isSubdevice = false;          // with controls, and with pads if it belongs to an entity
+  std::optional<FakeMedia> media{};  // of a media controller, which has nothing else
   std::uint32_t timestampFlags = V4L2_BUF_FLAG_TIMESTAMP_MONOTONIC;
   std::uint32_t firstSequence = 0;
   std::chrono::nanoseconds stampedAhead{0};          // the difference between a frame's time stamp and its delivery
@@ -98,6 +106,9 @@ class FakeV4l2Api : public V4l2Api {
   const DeviceRoots& roots() const { return roots_; }
   // Adds /dev/video<number> and returns its path.
   std::string add(int number, FakeNode node);
+  // The same for /dev/v4l-subdev<number> and /dev/media<number>. The entities name the paths of their device files.
+  std::string addSubdevice(int number, FakeNode node);
+  std::string addMedia(int number, FakeMedia media);
   // Calls `look` with the node while nothing changes.
   template <class Look>
   auto with(const std::string& path, Look&& look) {
@@ -110,6 +121,7 @@ class FakeV4l2Api : public V4l2Api {
   // Called before each call of a driver, on the same thread. Set it while there are no calls.
   std::function<void(unsigned long request)> beforeCall;
   int failNextMaps = 0;              // with ENOMEM
+  int mapsBeforeFailure = 0;         // that succeed before those
   int makeEventProblem = 0;          // an error number
   int guardProblem = 0;              // an error number
   std::atomic<int> pollProblem = 0;  // an error number
@@ -157,13 +169,29 @@ class FakeV4l2Api : public V4l2Api {
   };
   struct Mapping {
     std::string path;
+    std::int64_t offset = 0;
     std::vector<std::uint8_t> memory;
+  };
+  struct FakePlace {
+    FakeMedia* media = nullptr;
+    FakeEntity* entity = nullptr;
   };
 
   int call(FakeNode& node, int descriptor, unsigned long request, void* argument);
   int format(FakeNode& node, bool sets, v4l2_format& format) const;
-  int requestBuffers(FakeNode& node, int descriptor, v4l2_requestbuffers& request);
-  int dequeue(FakeNode& node, v4l2_buffer& buffer);
+  static int requestBuffers(FakeNode& node, int descriptor, v4l2_requestbuffers& request);
+  static int queryBuffer(const FakeNode& node, v4l2_buffer& buffer);
+  static int queue(FakeNode& node, const v4l2_buffer& buffer);
+  static int dequeue(FakeNode& node, v4l2_buffer& buffer);
+  bool isFree(const FakeNode& node, std::int64_t offset) const;
+  void makeDeviceFile(const std::string& name, std::uint32_t minor);
+  FakePlace placeOf(const std::string& path);
+  int mediaCall(FakeNode& node, unsigned long request, void* argument);
+  int topology(const FakeMedia& media, media_v2_topology& asked) const;
+  int setUpLink(FakeNode& node, const media_link_desc& wanted);
+  int subdeviceCall(FakeNode& node, int descriptor, unsigned long request, void* argument);
+  int padFormat(FakeNode& node, FakeEntity& entity, int descriptor, bool sets, v4l2_subdev_format& format);
+  int streamProblem(const FakeNode& camera);
   int enumerate(const FakeNode& node, unsigned long request, void* argument) const;
   int control(FakeNode& node, bool sets, v4l2_ext_controls& list);
   void fill(FakeNode& node, std::chrono::nanoseconds timestamp, std::uint32_t flags);
@@ -177,6 +205,8 @@ class FakeV4l2Api : public V4l2Api {
   std::condition_variable changed_;
   std::chrono::nanoseconds now_ = std::chrono::seconds(1000);
   std::map<std::string, FakeNode> nodes_;
+  std::map<std::string, std::uint32_t> minors_;  // of device files, by path
+  std::map<int, FakeEntity> tried_;              // what was tried on a sub-device, by descriptor
   std::map<int, std::string> descriptors_;
   std::map<int, bool> events_;
   std::map<void*, Mapping> mappings_;
@@ -192,7 +222,14 @@ constexpr std::uint32_t fakeCode(char a, char b, char c, char d) { return v4l2_f
 
 // A camera with the formats YUYV and GREY: 640x360 at 5, 25, 30 and 40 per second, and 640x480 at up to 25.
 FakeNode fakeCamera(const std::string& bus);
+// The same with the formats NM12 and NM16, whose frames have two planes.
+FakeNode fakeMultiplanarCamera(const std::string& bus);
 // A metadata node at the same bus.
 FakeNode fakeMetadata(const std::string& bus);
+
+bool isMetadata(const FakeNode& node);
+bool isMultiplanar(const FakeNode& node);
+// V4L2_BUF_TYPE_...
+std::uint32_t bufferTypeOf(const FakeNode& node);
 
 }  // namespace quazor

@@ -5,6 +5,8 @@
 #include "backends/threads/thread_concurrency.h"
 #include "diagnostics/camera_sync/camera_sync_experiment.h"
 
+#include <gtest/gtest.h>
+
 #include <chrono>
 #include <cstdint>
 #include <functional>
@@ -33,6 +35,12 @@ class FakeClock final : public Clock {
  private:
   const std::shared_ptr<FakeV4l2Api> kernel_;
 };
+
+// The name of a test with single-planar cameras, or, as its second parameter, with multi-planar ones.
+template <class Function>
+std::string nodesName(const testing::TestParamInfo<Function>& test) {
+  return test.index == 0 ? "SinglePlanar" : "Multiplanar";
+}
 
 struct Outcome {
   std::string error;  // empty if there is none

@@ -13,7 +13,12 @@ namespace {
 using Fake = FakeCameras;
 using namespace std::chrono_literals;
 
-class CameraSyncOnLinuxTest : public testing::Test {
+// The parameter makes the node of a camera.
+using CameraNodesTest = testing::TestWithParam<FakeNode (*)(const std::string& bus)>;
+
+constexpr auto kNodes = [] { return testing::Values(&fakeCamera, &fakeMultiplanarCamera); };
+
+class CameraSyncOnLinuxTest : public CameraNodesTest {
  protected:
   Platform platform() {
     Platform platform;
@@ -41,19 +46,19 @@ class CameraSyncOnLinuxTest : public testing::Test {
   }
 
   Fake fake_ = [] {
-    Fake fake;
+    Fake fake(fakeBinding(), GetParam());
     fake.release();
     return fake;
   }();
   const std::shared_ptr<FakeClock> clock_ = std::make_shared<FakeClock>(fake_.kernel);
 };
 
-TEST_F(CameraSyncOnLinuxTest, HealthyCamerasDeliverTheirFramesRunAfterRun) {
+TEST_P(CameraSyncOnLinuxTest, HealthyCamerasDeliverTheirFramesRunAfterRun) {
   expectHealthyRun();
   expectHealthyRun();
 }
 
-TEST_F(CameraSyncOnLinuxTest, EveryRefusedStartEndsInItsErrorAndTheNextRunIsHealthy) {
+TEST_P(CameraSyncOnLinuxTest, EveryRefusedStartEndsInItsErrorAndTheNextRunIsHealthy) {
   const struct {
     const char* name;
     unsigned long request;
@@ -77,7 +82,7 @@ TEST_F(CameraSyncOnLinuxTest, EveryRefusedStartEndsInItsErrorAndTheNextRunIsHeal
   }
 }
 
-TEST_F(CameraSyncOnLinuxTest, WhatHappensInMidStreamIsInTheCountersAndTheNextRunIsHealthy) {
+TEST_P(CameraSyncOnLinuxTest, WhatHappensInMidStreamIsInTheCountersAndTheNextRunIsHealthy) {
   const struct {
     const char* name;
     std::function<void(FakeV4l2Api&, const std::string&)> happens;
@@ -105,7 +110,7 @@ TEST_F(CameraSyncOnLinuxTest, WhatHappensInMidStreamIsInTheCountersAndTheNextRun
   }
 }
 
-TEST_F(CameraSyncOnLinuxTest, NoFramesAtAllGiveNoResult) {
+TEST_P(CameraSyncOnLinuxTest, NoFramesAtAllGiveNoResult) {
   fake_.kernel->with(fake_.nodes[0], [](FakeNode& node) { return node.delivers = false; });
   const Outcome outcome = run();
   EXPECT_EQ(outcome.result, nullptr);
@@ -113,17 +118,17 @@ TEST_F(CameraSyncOnLinuxTest, NoFramesAtAllGiveNoResult) {
   EXPECT_TRUE(fake_.kernel->isIdle());
 }
 
-TEST_F(CameraSyncOnLinuxTest, ARateThatTheDriverDoesNotHaveGivesNoResult) {
+TEST_P(CameraSyncOnLinuxTest, ARateThatTheDriverDoesNotHaveGivesNoResult) {
   EXPECT_EQ(run({0, 0, 0}, 50).result, nullptr);
   EXPECT_TRUE(fake_.kernel->isIdle());
 }
 
-TEST_F(CameraSyncOnLinuxTest, AFormatThatIsNotThereIsItsError) {
+TEST_P(CameraSyncOnLinuxTest, AFormatThatIsNotThereIsItsError) {
   EXPECT_EQ(run({0, 16, 0}).error, "QZCapturePlugInErrorDomain code 209: Failed to set format index to 16");
   EXPECT_TRUE(fake_.kernel->isIdle());
 }
 
-TEST_F(CameraSyncOnLinuxTest, ACameraInUseElsewhereCannotBeSynchronised) {
+TEST_P(CameraSyncOnLinuxTest, ACameraInUseElsewhereCannotBeSynchronised) {
   const int other = fake_.kernel->open(fake_.nodes[1]);
   ASSERT_EQ(fake_.kernel->lock(other), 0);
   EXPECT_EQ(run().error, "QZCapturePlugInErrorDomain code 214: Failed to synchronize cameras!");
@@ -146,7 +151,9 @@ Binding projectorBinding() {
   return binding;
 }
 
-class ProjectorFaultOnLinuxTest : public testing::Test {
+INSTANTIATE_TEST_SUITE_P(Nodes, CameraSyncOnLinuxTest, kNodes(), nodesName<FakeNode (*)(const std::string& bus)>);
+
+class ProjectorFaultOnLinuxTest : public CameraNodesTest {
  protected:
   ProjectorFaultOnLinuxTest() {
     setMetadata({1, 0, 0, 0});
@@ -194,17 +201,19 @@ class ProjectorFaultOnLinuxTest : public testing::Test {
     return outcome;
   }
 
-  Fake fake_{projectorBinding()};
+  Fake fake_{projectorBinding(), GetParam()};
 };
 
-TEST_F(ProjectorFaultOnLinuxTest, LitFramesGiveAResultWithoutErrors) {
+INSTANTIATE_TEST_SUITE_P(Nodes, ProjectorFaultOnLinuxTest, kNodes(), nodesName<FakeNode (*)(const std::string& bus)>);
+
+TEST_P(ProjectorFaultOnLinuxTest, LitFramesGiveAResultWithoutErrors) {
   const Outcome outcome = run();
   ASSERT_NE(outcome.result, nullptr) << outcome.error;
   EXPECT_GE(outcome.measured("FrameCount"), 30);
   for (const char* name : {"I2C", "MIPI", "LPDP", "UART", "SIF", "Projector"}) EXPECT_EQ(outcome.measured(name), 0);
 }
 
-TEST_F(ProjectorFaultOnLinuxTest, DarkFramesEndInTheirErrors) {
+TEST_P(ProjectorFaultOnLinuxTest, DarkFramesEndInTheirErrors) {
   setMetadata({0, 0, 0, 0});
   EXPECT_EQ(run().error, "QZCapturePlugInErrorDomain code 206: Frame 1 is not illuminated for unknown reason!");
   setMetadata({0, 0, 0, 0x20});
@@ -213,7 +222,7 @@ TEST_F(ProjectorFaultOnLinuxTest, DarkFramesEndInTheirErrors) {
   EXPECT_EQ(run().error, "QZCapturePlugInErrorDomain code 206: Could not create a frame description of frame 1!");
 }
 
-TEST_F(ProjectorFaultOnLinuxTest, AFatalErrorLeavesTooFewFramesAndADisconnectIsAStopThatFailed) {
+TEST_P(ProjectorFaultOnLinuxTest, AFatalErrorLeavesTooFewFramesAndADisconnectIsAStopThatFailed) {
   const Outcome fatal = run([this] { fake_.kernel->breakStream(fake_.nodes[3]); });
   ASSERT_NE(fatal.result, nullptr) << fatal.error;
   EXPECT_LT(fatal.measured("FrameCount"), 30);

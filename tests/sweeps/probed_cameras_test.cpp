@@ -1,5 +1,6 @@
 // The camera experiments with the binding that the probe writes, on cameras whose formats differ from each other.
 #include "backends/linux/counters/counter_system_for_tests.h"
+#include "backends/linux/media/media_for_tests.h"
 #include "backends/linux/probe/probe.h"
 #include "diagnostics/single_camera/single_camera_experiment.h"
 #include "tests/sweeps/linux_cameras.h"
@@ -22,23 +23,32 @@ FakeNode webcam(int number) {
   return node;
 }
 
-class ProbedCamerasTest : public testing::Test {
+// A camera of a board: the same, but its frames have two planes.
+FakeNode boardCamera(int number) {
+  FakeNode node = webcam(number);
+  node.capabilities = V4L2_CAP_VIDEO_CAPTURE_MPLANE | V4L2_CAP_STREAMING;
+  return node;
+}
+
+// A platform with the binding that the probe writes.
+Platform platformOf(const std::shared_ptr<FakeV4l2Api>& kernel) {
+  const std::filesystem::path file = kernel->roots().sysfs.parent_path() / "binding.json";
+  std::ofstream(file) << probeMachine({kernel, kernel->roots(), {}, std::make_shared<FakeCounters>(), file}).binding;
+  Platform platform;
+  platform.capture = makeLinuxCapture(readBinding(file), kernel, kernel->roots());
+  platform.clock = std::make_shared<FakeClock>(kernel);
+  platform.concurrency = std::make_shared<ThreadConcurrency>();
+  return platform;
+}
+
+// The parameter makes the node of a camera.
+class ProbedCamerasTest : public testing::TestWithParam<FakeNode (*)(int number)> {
  protected:
   ProbedCamerasTest() {
-    for (int i = 0; i < 5; ++i) kernel_->add(i, webcam(i));
+    for (int i = 0; i < 5; ++i) kernel_->add(i, GetParam()(i));
   }
 
-  // A platform with the binding that the probe writes.
-  Platform probedPlatform() {
-    const std::filesystem::path file = kernel_->roots().sysfs.parent_path() / "binding.json";
-    std::ofstream(file)
-        << probeMachine({kernel_, kernel_->roots(), {}, std::make_shared<FakeCounters>(), file}).binding;
-    Platform platform;
-    platform.capture = makeLinuxCapture(readBinding(file), kernel_, kernel_->roots());
-    platform.clock = std::make_shared<FakeClock>(kernel_);
-    platform.concurrency = std::make_shared<ThreadConcurrency>();
-    return platform;
-  }
+  Platform probedPlatform() { return platformOf(kernel_); }
 
   Outcome run(const std::vector<std::string>& ports, Array formats) {
     QZCameraSyncExperiment experiment(ports, std::move(formats), 30, probedPlatform());
@@ -48,7 +58,10 @@ class ProbedCamerasTest : public testing::Test {
   const std::shared_ptr<FakeV4l2Api> kernel_ = std::make_shared<FakeV4l2Api>();
 };
 
-TEST_F(ProbedCamerasTest, TheBackCamerasRunAsTheyWereProbed) {
+INSTANTIATE_TEST_SUITE_P(Nodes, ProbedCamerasTest, testing::Values(&webcam, &boardCamera),
+                         nodesName<FakeNode (*)(int number)>);
+
+TEST_P(ProbedCamerasTest, TheBackCamerasRunAsTheyWereProbed) {
   const Outcome outcome = run({text(port_type::BackFacingCamera), text(port_type::BackFacingTelephotoCamera),
                                text(port_type::BackFacingSuperWideCamera)},
                               {16, 14, 9});
@@ -59,7 +72,7 @@ TEST_F(ProbedCamerasTest, TheBackCamerasRunAsTheyWereProbed) {
   EXPECT_TRUE(kernel_->isIdle());
 }
 
-TEST_F(ProbedCamerasTest, TheFrontCamerasRunAsTheyWereProbed) {
+TEST_P(ProbedCamerasTest, TheFrontCamerasRunAsTheyWereProbed) {
   const Outcome outcome = run({text(port_type::FrontFacingCamera), text(port_type::FrontFacingInfraredCamera)}, {1, 0});
   ASSERT_NE(outcome.result, nullptr) << outcome.error;
   for (const auto& [name, measurement] : outcome.result->measurements()) {
@@ -69,7 +82,7 @@ TEST_F(ProbedCamerasTest, TheFrontCamerasRunAsTheyWereProbed) {
   EXPECT_TRUE(kernel_->isIdle());
 }
 
-TEST_F(ProbedCamerasTest, OneCameraRunsAsItWasProbed) {
+TEST_P(ProbedCamerasTest, OneCameraRunsAsItWasProbed) {
   QZSingleCameraExperiment experiment(probedPlatform());
   const Outcome outcome = outcomeOf(experiment, Dictionary{{"duration", 2.99}});
   ASSERT_NE(outcome.result, nullptr) << outcome.error;
@@ -79,6 +92,21 @@ TEST_F(ProbedCamerasTest, OneCameraRunsAsItWasProbed) {
   EXPECT_LT(outcome.measured("SilenceAtEnd"), 40);
   EXPECT_TRUE(experiment.teardown(nullptr));
   EXPECT_TRUE(kernel_->isIdle());
+}
+
+TEST(ProbedBoardTest, ACameraBehindAMediaControllerRunsAsItWasProbed) {
+  const FakeBoard board;
+  const std::vector<FakeLink> before = board.links();
+  board.kernel->with(board.camera, [](FakeNode& node) { return node.interval = {1, 30}; });
+  {
+    QZSingleCameraExperiment experiment(platformOf(board.kernel));
+    const Outcome outcome = outcomeOf(experiment, Dictionary{{"duration", 2.99}});
+    ASSERT_NE(outcome.result, nullptr) << outcome.error;
+    EXPECT_EQ(outcome.measured("Frames"), 90);
+    EXPECT_TRUE(experiment.teardown(nullptr));
+  }
+  EXPECT_EQ(board.links(), before);
+  EXPECT_TRUE(board.kernel->isIdle());
 }
 
 }  // namespace

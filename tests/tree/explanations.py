@@ -28,6 +28,10 @@ PLUGIN_FOLDERS = {
     "diagnostics/sensor_images": {"NimbeImageExperiment"},
     "diagnostics/single_camera": {"SingleCameraDiagnostic"},
 }
+# The project that `quazor new` copies, which explains the errors of its own domain.
+TEMPLATE_FOLDER = "examples/event_count"
+SENDERS = {**PLUGIN_FOLDERS, TEMPLATE_FOLDER: {"EventCountDiagnostic"}}
+SHARED_DOMAIN = "QZErrorDomain"
 CATALOGUE_FOLDERS = ["plugins", *PLUGIN_FOLDERS]
 ALL_FOLDERS = ["contract", "platform", "base", "diagnostics", "plugins", "backends", "host"]
 
@@ -35,10 +39,9 @@ PLACEHOLDER = re.compile(r"%(?:@|lu|lf|d)")
 IN_CAPITALS = re.compile(r"[A-Z :]+")  # placeholders such as NAME and DOMAIN:CODE
 
 
-def read(folder):
+def read(folder, schema):
     """The entries of all files, and the problems of the files."""
-    validator = jsonschema.Draft202012Validator(
-        json.loads((folder / "explanations.schema.json").read_text(encoding="utf-8")))
+    validator = jsonschema.Draft202012Validator(json.loads(schema.read_text(encoding="utf-8")))
     entries, found = [], []
     for file in sorted(folder.glob("*.json")):
         if file.name.endswith(".schema.json"):
@@ -61,11 +64,11 @@ def message_problems(entry, errors):
     returned = {}
     for error in errors:
         folder = str(pathlib.PurePosixPath(error.file).parent)
-        if folder not in PLUGIN_FOLDERS:
+        if folder not in SENDERS:
             continue
         if error.message is None:
             return [f"{name_of(entry)}: {error.file} makes it with a message that cannot be followed"]
-        returned.setdefault(PLACEHOLDER.sub("...", error.message), set()).update(PLUGIN_FOLDERS[folder])
+        returned.setdefault(PLACEHOLDER.sub("...", error.message), set()).update(SENDERS[folder])
     explained = {message["text"]: set(message["from"]) for message in entry.get("messages", [])}
     found = [f"{name_of(entry)}: the message '{text}' is missing" for text in returned if text not in explained]
     for text, senders in explained.items():
@@ -93,6 +96,12 @@ def error_problems(entries, errors):
             found.append(f"{name_of(entry)}: its symbols are {symbols}, not {entry.get('symbols', [])}")
         found += message_problems(entry, by_key[key])
     return found
+
+
+def template_problems(entries, errors):
+    """`errors` are all of the template's sources; those of the shared domain are explained with the shipped plug-ins'."""
+    own = [error for error in errors if error.domain != SHARED_DOMAIN]
+    return error_problems(entries, own) + ([] if own else ["the template returns no error of its own"])
 
 
 def name_problems(entries, registered, results):
@@ -169,9 +178,12 @@ def results_of(program, plugin):
 def main():
     root, program, plugin = pathlib.Path(sys.argv[1]), sys.argv[2], sys.argv[3]
     sys.stdout.reconfigure(line_buffering=True)
-    entries, found = read(root / "data" / "explanations")
+    schema = root / "data/explanations/explanations.schema.json"
+    entries, found = read(schema.parent, schema)
+    of_template, wrong = read(root / TEMPLATE_FOLDER / "explanations", schema)
     try:
         errors = error_codes.errors_of(root, ALL_FOLDERS)
+        found += wrong + template_problems(of_template, error_codes.errors_of(root, [TEMPLATE_FOLDER]))
         registered = error_codes.registered(root, CATALOGUE_FOLDERS)
     except error_codes.UnknownForm as unknown:
         print(unknown)

@@ -61,6 +61,20 @@ class ErrorProblemsTest(unittest.TestCase):
                 self.assertEqual(self.problems(entries, errors), [expected])
 
 
+class TemplateProblemsTest(unittest.TestCase):
+    OWN = Error(f"{explanations.TEMPLATE_FOLDER}/a.cpp", "D", 1, "kA", "no %@!")
+    SHARED = Error(f"{explanations.TEMPLATE_FOLDER}/a.cpp", explanations.SHARED_DOMAIN, 5, "kB", None)
+    ENTRY = changed(ERROR, messages=[{"text": "no ...!", "from": ["EventCountDiagnostic"]}])
+
+    def test_its_own_errors_are_explained(self):
+        self.assertEqual(explanations.template_problems([self.ENTRY, *NAMES], [self.OWN, self.SHARED]), [])
+
+    def test_each_problem_is_found(self):
+        self.assertEqual(explanations.template_problems(NAMES, [self.OWN]),
+                         [f"D:1 has no explanation; {explanations.TEMPLATE_FOLDER}/a.cpp returns it"])
+        self.assertEqual(explanations.template_problems([], [self.SHARED]), ["the template returns no error of its own"])
+
+
 class NameProblemsTest(unittest.TestCase):
     def test_what_is_right_passes(self):
         self.assertEqual(explanations.name_problems([ERROR, *NAMES], REGISTERED, RESULTS), [])
@@ -115,7 +129,7 @@ class ReadTest(unittest.TestCase):
             folder = pathlib.Path(directory)
             shutil.copy(SCHEMA, folder)
             (folder / "a.json").write_text(json.dumps(content))
-            return explanations.read(folder)
+            return explanations.read(folder, folder / "explanations.schema.json")
 
     def test_a_file_of_errors_is_read_with_their_domain(self):
         self.assertEqual(self.read({"schema": 1, "domain": "D", "errors": [{"code": 1, **TEXTS}]}),

@@ -7,11 +7,13 @@ In every Markdown document below PREFIX, and in the manual pages:
 
   - A relative link leads to an installed file, and its anchor to a heading of that file.
   - A file or folder of the source tree that a text names in `back quotes`, or an excerpt comes from, is installed: headers
-    in include/quazor, data in share/quazor, documents and examples in share/doc. A path below /usr is one below PREFIX.
+    in include/quazor, documents and examples in share/doc. A path below /usr is one below PREFIX. A file of `data` is
+    elsewhere in an installation, in share/quazor, and so is named by that path or by a command that lists it.
     What a source tree alone has may be named in a paragraph that speaks of the "source tree", and in all of a document whose
     first paragraph does.
   - Commands and options of quazor are those in the help of PROGRAM, which is PREFIX/bin/quazor unless it is given.
   - `./run` and `./test` do not appear: an installation has neither.
+  - share/doc/quazor/index.md has a link to each document beside it.
 
 Exits with 1 and prints a line per dead end, also if there is no document.
 """
@@ -28,10 +30,11 @@ FENCE = re.compile(r"^ {0,3}(`{3,}|~{3,})\s*(\S*)\s*(.*?)\s*$")
 HEADING = re.compile(r"^#{1,6}\s+(.*?)\s*#*$")
 # Folders of the tree, and where an installation has their files.
 INSTALLED = {
-    "contract": "include/quazor/contract", "platform": "include/quazor/platform", "data": "share/quazor",
+    "contract": "include/quazor/contract", "platform": "include/quazor/platform",
     "docs": "share/doc/quazor", "examples": "share/doc/libquazor-dev/examples", "share": "share",
 }
-TREE_ONLY = ("backends", "base", "benchmarks", "cmake", "diagnostics", "host", "packaging", "plugins", "tests")
+TREE_ONLY = ("backends", "base", "benchmarks", "cmake", "data", "diagnostics", "host", "packaging", "plugins", "tests")
+INDEX = "share/doc/quazor/index.md"
 SAID = "source tree"
 PATH = re.compile(r"^/?[\w.*-]+(/[\w.*-]*)+$")
 
@@ -185,12 +188,20 @@ class Installation:
         return [(0, one) for path in paths for one in self.problem_with_path(path)]
 
 
+    def problems_of_index(self):
+        index = self.prefix / INDEX
+        linked = set(LINK.findall(index.read_text(encoding="utf-8"))) if index.exists() else set()
+        beside = sorted(one.name for one in index.parent.glob("*.md"))
+        return [(0, f"it has no link to {one}") for one in beside if one not in linked and one != index.name]
+
+
 def main():
     prefix = pathlib.Path(sys.argv[1])
     installation = Installation(prefix, Program(sys.argv[2] if len(sys.argv) > 2 else prefix / "bin/quazor"))
     documents = sorted(prefix.rglob("*.md"))
     pages = sorted((prefix / "share/man").rglob("*.[1-8]"))
     problems = [(document, *one) for document in documents for one in installation.problems_of_document(document)]
+    problems += [(prefix / INDEX, *one) for one in installation.problems_of_index()]
     problems += [(page, *one) for page in pages for one in installation.problems_of_page(page)]
     for file, line, problem in problems:
         print(f"{file.relative_to(prefix)}:{line}: {problem}")

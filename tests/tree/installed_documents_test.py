@@ -18,12 +18,13 @@ esac
 
 
 class InstalledDocumentsTest(unittest.TestCase):
-    def dead_ends(self, text, page="A page of quazor.\n"):
+    def dead_ends(self, text, page="A page of quazor.\n", index="See [a](a.md) and [other](other.md).\n"):
         """The exit code, and the dead ends of a document with this text."""
         with tempfile.TemporaryDirectory() as directory:
             prefix = pathlib.Path(directory)
             for name, content in (("bin/quazor", PROGRAM), ("share/doc/quazor/a.md", text), ("share/man/man1/quazor.1", page),
                                   ("share/doc/quazor/other.md", "# Other\n\n## A `code` of 2 words, here\n"),
+                                  ("share/doc/quazor/index.md", index),
                                   ("include/quazor/contract/value.h", ""), ("share/quazor/scenarios/healthy.json", "{}")):
                 (prefix / name).parent.mkdir(parents=True, exist_ok=True)
                 (prefix / name).write_text(content)
@@ -32,7 +33,7 @@ class InstalledDocumentsTest(unittest.TestCase):
                                  capture_output=True, text=True, check=False)
             self.assertEqual(run.stderr, "")
             *lines, total = run.stdout.splitlines()
-            self.assertEqual(total, f"2 documents, 1 manual pages: {len(lines)} dead ends")
+            self.assertEqual(total, f"3 documents, 1 manual pages: {len(lines)} dead ends")
             return run.returncode, lines
 
     FINE = [
@@ -40,9 +41,10 @@ class InstalledDocumentsTest(unittest.TestCase):
         ("a link to a heading", "See [it](other.md#a-code-of-2-words-here)."),
         ("a link to a heading of its own", "# Here it is\n\nSee [above](#here-it-is)."),
         ("a link in a block", "```text\n[x](nothing.md)\n```"),
-        ("what is installed", "`contract/value.h`, `contract/`, `data/scenarios/healthy.json`, `data/scenarios/*.json`"),
+        ("what is installed", "`contract/value.h`, `contract/`, `share/quazor/scenarios/healthy.json`, `share/quazor/scenarios/*.json`"),
         ("a path of the system", "`/dev/null` and `/proc/self/fd` and `/usr/include/quazor/contract/value.h`"),
-        ("a path that stands for others", "`data/scenarios/NAME.json`"),
+        ("a path that stands for others", "`share/quazor/scenarios/NAME.json`"),
+        ("data of the source tree, said so", "In the source\ntree, `data/scenarios/healthy.json`."),
         ("what only the source tree has, said so", "In the source tree, `tests/tree/x.py`\nand `host/y.h`."),
         ("a document about the source tree", "# A\n\nThis is about the source\ntree.\n\nLook at `host/y.h`."),
         ("commands and options", "`quazor run --all --set a=-1 | head`, `--format`, `--help`, `quazor --version`"),
@@ -61,6 +63,7 @@ class InstalledDocumentsTest(unittest.TestCase):
         ("a link over two lines", "A [b\nc](nothing.md).", "the link nothing.md leads nowhere"),
         ("a header", "`contract/nothing.h`", "contract/nothing.h is not installed"),
         ("a file of the tree", "Look at `tests/tree/x.py`.", "tests/tree/x.py is not installed"),
+        ("data where the source tree has them", "`data/scenarios/healthy.json`", "data/scenarios/healthy.json is not installed"),
         ("a folder of the tree", "Look at `backends/`.", "backends/ is not installed"),
         ("a path of another machine", "`/usr/include/nothing.h`", "/usr/include/nothing.h is not installed"),
         ("an excerpt", "```cpp from examples/x.cpp\nint a;\n```", "examples/x.cpp is not installed"),
@@ -79,6 +82,10 @@ class InstalledDocumentsTest(unittest.TestCase):
                 self.assertEqual((code, len(lines)), (1, 1), lines)
                 self.assertRegex(lines[0], r"^share/doc/quazor/a\.md:\d+: ")
                 self.assertIn(expected, lines[0])
+
+    def test_an_index_without_a_document(self):
+        code, lines = self.dead_ends("", index="See [other](other.md).\n")
+        self.assertEqual((code, lines), (1, ["share/doc/quazor/index.md:0: it has no link to a.md"]))
 
     def test_a_manual_page(self):
         self.assertEqual(self.dead_ends("", "See /usr/share/quazor/scenarios.\n")[0], 0)

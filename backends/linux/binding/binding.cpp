@@ -2,6 +2,7 @@
 
 #include "backends/faults/fault_reader.h"
 #include "backends/linux/binding/binding_counters.h"
+#include "backends/linux/binding/binding_media.h"
 #include "base/json/json_cursor.h"
 #include "platform/capture_keys.h"
 
@@ -20,11 +21,9 @@ namespace {
 constexpr std::array kPorts{port_type::BackFacingCamera, port_type::BackFacingTelephotoCamera,
                             port_type::BackFacingSuperWideCamera, port_type::FrontFacingCamera,
                             port_type::FrontFacingInfraredCamera};
-constexpr std::uint64_t kMaxSide = 65536;
 constexpr std::uint64_t kMinBuffers = 2;
-constexpr std::uint64_t kMaxBuffers = 32;          // VIDEO_MAX_FRAME of linux/videodev2.h
-constexpr std::size_t kMaxControlNameLength = 31;  // without the null; v4l2_query_ext_ctrl has 32 bytes
-constexpr std::size_t kMaxDriverLength = 15;       // without the null, in v4l2_capability
+constexpr std::uint64_t kMaxBuffers = 32;     // VIDEO_MAX_FRAME of linux/videodev2.h
+constexpr std::size_t kMaxDriverLength = 15;  // without the null, in v4l2_capability
 constexpr std::size_t kMaxCardLength = 31;
 constexpr std::size_t kMaxBusInfoLength = 31;
 constexpr std::uint64_t kMaxUsbInterface = 255;
@@ -44,30 +43,13 @@ std::vector<std::pair<std::string, JsonCursor>> namedEntries(const JsonCursor& c
   return entries;
 }
 
-std::string readControlName(const std::string& name, const JsonCursor& cursor) {
-  if (name.size() <= kMaxControlNameLength) return name;
-  cursor.fail(inQuotes(name) + " is not a valid control name; names have at most " +
-              std::to_string(kMaxControlNameLength) + " characters.");
-}
-
-std::optional<std::string> findDeviceText(const JsonCursor& cursor, std::string_view key, std::size_t longest) {
-  const std::optional<JsonCursor> found = cursor.find(key);
-  if (!found) return std::nullopt;
-  std::string text = found->text();
-  if (text.size() > longest) {
-    found->fail("a driver reports at most " + std::to_string(longest) + " characters here, and this has " +
-                std::to_string(text.size()) + "; 'quazor phone probe' shows the reported text.");
-  }
-  return text;
-}
-
 std::optional<std::string> findControl(const JsonCursor& cursor, std::string_view key) {
   const std::optional<JsonCursor> found = cursor.find(key);
   return found ? std::optional(readControlName(found->text(), *found)) : std::nullopt;
 }
 
 VideoNodeMatch readMatch(const JsonCursor& cursor) {
-  cursor.allowKeys({"driver", "card", "busInfo", "usbInterface", "path"});
+  cursor.allowKeys({"driver", "card", "busInfo", "usbInterface", "path", "name"});
   VideoNodeMatch match{findDeviceText(cursor, "driver", kMaxDriverLength),
                        findDeviceText(cursor, "card", kMaxCardLength),
                        findDeviceText(cursor, "busInfo", kMaxBusInfoLength)};
@@ -79,9 +61,11 @@ VideoNodeMatch readMatch(const JsonCursor& cursor) {
     if (!match.path->starts_with("/sys/"))
       path->fail("must be the device's path in sysfs, such as \"/sys/devices/...\".");
   }
-  if (!match.driver && !match.card && !match.busInfo && !match.path) {
+  match.name = findDeviceText(cursor, "name", kMaxEntityLength);
+  if (!match.driver && !match.card && !match.busInfo && !match.path && !match.name) {
     cursor.fail(
-        "give at least one of \"driver\", \"card\", \"busInfo\" and \"path\"; 'quazor phone probe' shows them.");
+        "give at least one of \"driver\", \"card\", \"busInfo\", \"path\" and \"name\"; 'quazor phone probe' shows "
+        "them.");
   }
   return match;
 }
@@ -190,25 +174,12 @@ ErrorCounterBinding readErrorCounter(const std::string& name, const JsonCursor& 
   return counter;
 }
 
-void readSize(const JsonCursor& size, std::uint32_t* width, std::uint32_t* height) {
-  size.allowKeys({"width", "height"});
-  *width = static_cast<std::uint32_t>(size.at("width").integer(1, kMaxSide));
-  *height = static_cast<std::uint32_t>(size.at("height").integer(1, kMaxSide));
-}
-
 std::uint32_t readFormatIndex(const std::string& key, const JsonCursor& cursor) {
   std::uint32_t index = 0;
   const char* const end = key.data() + key.size();
   const auto [parsed, problem] = std::from_chars(key.data(), end, index);
   if (problem == std::errc() && parsed == end && std::to_string(index) == key) return index;
   cursor.fail(inQuotes(key) + " is not a format index; expected a whole number, such as \"16\".");
-}
-
-FrameInterval readInterval(const JsonCursor& cursor) {
-  cursor.allowKeys({"numerator", "denominator"});
-  constexpr std::uint64_t kMax = std::numeric_limits<std::uint32_t>::max();
-  return {static_cast<std::uint32_t>(cursor.at("numerator").integer(1, kMax)),
-          static_cast<std::uint32_t>(cursor.at("denominator").integer(1, kMax))};
 }
 
 std::vector<FormatBinding> readFormats(const JsonCursor& cursor, const CameraBinding& camera) {
@@ -232,8 +203,8 @@ CameraBinding readCamera(const std::string& port, const JsonCursor& cursor) {
   if (std::ranges::find(kPorts, port) == kPorts.end()) {
     cursor.fail(inQuotes(port) + " is not a port" + suggestion(port, kPorts));
   }
-  cursor.allowKeys(
-      {"description", "node", "size", "formats", "buffers", "controls", "metadata", "projector", "errorCounters"});
+  cursor.allowKeys({"description", "node", "size", "formats", "buffers", "controls", "metadata", "projector",
+                    "errorCounters", "media"});
   checkRemark(cursor, "description");
   CameraBinding camera;
   camera.port = port;
@@ -251,6 +222,7 @@ CameraBinding readCamera(const std::string& port, const JsonCursor& cursor) {
       camera.errorCounters.push_back(readErrorCounter(name, value));
     }
   }
+  if (const auto media = cursor.find("media")) camera.media = readMedia(*media);
   return camera;
 }
 
@@ -258,6 +230,7 @@ std::vector<CameraBinding> readCameras(const JsonCursor& cursor) {
   std::vector<CameraBinding> cameras;
   for (const auto& [port, value] : cursor.entries()) {
     CameraBinding camera = readCamera(port, value);
+    if (camera.media) requireSameLinks(value.at("media"), camera, cameras);
     const auto isSame = [&camera](const CameraBinding& other) { return other.node == camera.node; };
     if (const auto same = std::ranges::find_if(cameras, isSame); same != cameras.end()) {
       value.at("node").fail(
@@ -326,6 +299,8 @@ Binding bindingOf(const JsonCursor& document) {
 }
 
 }  // namespace
+
+std::string textOf(const PadName& pad) { return pad.entity + ":" + std::to_string(pad.pad); }
 
 Binding readBinding(const std::filesystem::path& file) { return bindingOf(JsonCursor(JsonDocument::read(file))); }
 

@@ -31,11 +31,13 @@ struct VideoNodeMatch {
   std::optional<std::uint32_t>
       usbInterface{};                 // the number of the USB interface, for several cameras of one USB device
   std::optional<std::string> path{};  // of the device in sysfs, which changes if it is connected elsewhere
+  std::optional<std::string> name{};  // of the node in sysfs, which is that of its entity in a media controller
 
   friend bool operator==(const VideoNodeMatch&, const VideoNodeMatch&) = default;
 };
 
-// A control of a video node, by the driver's name for it (VIDIOC_QUERY_EXT_CTRL), and a value.
+// A control of a camera, by the driver's name for it (VIDIOC_QUERY_EXT_CTRL), by its number, or after the name of its
+// entity in a media controller ("imx219 4-0010:Exposure"), and a value.
 struct ControlSetting {
   std::string control;
   std::int64_t value = 0;
@@ -100,6 +102,67 @@ struct FormatBinding {
   friend bool operator==(const FormatBinding&, const FormatBinding&) = default;
 };
 
+// Selects a media controller by what its driver reports (MEDIA_IOC_DEVICE_INFO). A member without a value matches
+// everything.
+struct MediaDeviceMatch {
+  std::optional<std::string> driver;
+  std::optional<std::string> model;
+  std::optional<std::string> busInfo;
+
+  friend bool operator==(const MediaDeviceMatch&, const MediaDeviceMatch&) = default;
+};
+
+// A pad of an entity: "imx219 4-0010:0".
+struct PadName {
+  std::string entity;
+  std::uint32_t pad = 0;
+
+  friend bool operator==(const PadName&, const PadName&) = default;
+};
+std::string textOf(const PadName& pad);
+
+struct LinkBinding {
+  PadName source;
+  PadName sink;
+  bool enabled = true;
+
+  friend bool operator==(const LinkBinding&, const LinkBinding&) = default;
+};
+
+struct FrameArea {
+  std::uint32_t left = 0;
+  std::uint32_t top = 0;
+  std::uint32_t width = 0;
+  std::uint32_t height = 0;
+
+  friend bool operator==(const FrameArea&, const FrameArea&) = default;
+};
+
+// The format of frames at a pad.
+struct PadFormat {
+  std::uint32_t code = 0;  // MEDIA_BUS_FMT_...
+  std::uint32_t width = 0;
+  std::uint32_t height = 0;
+
+  friend bool operator==(const PadFormat&, const PadFormat&) = default;
+};
+
+// Settings of a pad, made in the order of the members.
+struct PadBinding {
+  PadName pad;
+  std::optional<PadFormat> format;
+  std::optional<FrameArea> crop;
+  std::optional<FrameInterval> interval;
+};
+
+// The path of a camera's frames through a media controller.
+struct MediaBinding {
+  MediaDeviceMatch device;
+  std::vector<LinkBinding> links;       // set in this order, before the pads
+  std::vector<PadBinding> pads;         // set in this order
+  std::vector<std::string> subdevices;  // entities whose controls the camera has, in addition to those on its path
+};
+
 struct CameraBinding {
   std::string port;  // platform/capture_keys.h, port_type
   VideoNodeMatch node;
@@ -111,6 +174,7 @@ struct CameraBinding {
   MetadataBinding metadata;
   std::optional<ProjectorBinding> projector;
   std::vector<ErrorCounterBinding> errorCounters;
+  std::optional<MediaBinding> media{};
 };
 
 // Cameras that can be synchronised, in a fixed order.

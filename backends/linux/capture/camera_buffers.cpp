@@ -15,8 +15,7 @@ std::chrono::nanoseconds timeOf(const timeval& time) {
 
 }  // namespace
 
-CameraBuffers::CameraBuffers(std::shared_ptr<V4l2Device> node, std::uint32_t type)
-    : node_(std::move(node)), type_(type) {}
+CameraBuffers::CameraBuffers(std::shared_ptr<V4l2Device> node) : node_(std::move(node)), type_(node_->bufferType()) {}
 
 CameraBuffers::~CameraBuffers() { release(nullptr); }
 
@@ -35,31 +34,42 @@ bool CameraBuffers::prepare(std::uint32_t count, DiagnosticErrorPtr* error) {
     if (!map(index, error)) return false;
   }
   for (std::uint32_t index = 0; index < request.count; ++index) {
-    v4l2_buffer buffer = bufferOf(index);
-    if (!node_->call(VIDIOC_QBUF, "VIDIOC_QBUF", &buffer, error)) return false;
+    BufferCall call(*this, index);
+    if (!node_->call(VIDIOC_QBUF, "VIDIOC_QBUF", &call.buffer, error)) return false;
   }
   return true;
 }
 
 bool CameraBuffers::map(std::uint32_t index, DiagnosticErrorPtr* error) {
-  v4l2_buffer buffer = bufferOf(index);
-  if (!node_->call(VIDIOC_QUERYBUF, "VIDIOC_QUERYBUF", &buffer, error)) return false;
-  Mapped mapped{nullptr, buffer.length};
-  const int result = node_->kernel().map(node_->descriptor(), mapped.length, buffer.m.offset, &mapped.address);
+  BufferCall call(*this, index);
+  if (!node_->call(VIDIOC_QUERYBUF, "VIDIOC_QUERYBUF", &call.buffer, error)) return false;
+  mapped_.emplace_back();
+  if (!node_->isMultiplanar()) return mapPlane(call.buffer.length, call.buffer.m.offset, error);
+  const std::size_t count = std::min<std::size_t>(call.buffer.length, call.planes.size());
+  return std::ranges::all_of(std::span(call.planes).first(count), [&](const v4l2_plane& plane) {
+    return mapPlane(plane.length, plane.m.mem_offset, error);
+  });
+}
+
+// Maps a plane of the last buffer.
+bool CameraBuffers::mapPlane(std::size_t length, std::uint32_t offset, DiagnosticErrorPtr* error) {
+  Mapped mapped{nullptr, length};
+  const int result = node_->kernel().map(node_->descriptor(), length, offset, &mapped.address);
   if (result < 0) {
     failSystemCall(error, "mmap", node_->path(), -result);
     return false;
   }
-  mapped_.push_back(mapped);
+  mapped_.back().push_back(mapped);
   return true;
 }
 
-v4l2_buffer CameraBuffers::bufferOf(std::uint32_t index) const {
-  v4l2_buffer buffer{};
+CameraBuffers::BufferCall::BufferCall(const CameraBuffers& buffers, std::uint32_t index) {
   buffer.index = index;
-  buffer.type = type_;
+  buffer.type = buffers.type_;
   buffer.memory = V4L2_MEMORY_MMAP;
-  return buffer;
+  if (!buffers.node_->isMultiplanar()) return;
+  buffer.m.planes = planes.data();
+  buffer.length = static_cast<std::uint32_t>(planes.size());
 }
 
 bool CameraBuffers::streamOn(DiagnosticErrorPtr* error) {
@@ -75,7 +85,9 @@ bool CameraBuffers::release(DiagnosticErrorPtr* error) {
     int type = static_cast<int>(type_);
     if (!node_->call(VIDIOC_STREAMOFF, "VIDIOC_STREAMOFF", &type, firstError())) succeeded = false;
   }
-  for (const Mapped& one : std::exchange(mapped_, {})) node_->kernel().unmap(one.address, one.length);
+  for (const std::vector<Mapped>& planes : std::exchange(mapped_, {})) {
+    for (const Mapped& one : planes) node_->kernel().unmap(one.address, one.length);
+  }
   refused_.clear();
   if (std::exchange(requested_, false)) {
     v4l2_requestbuffers request{};
@@ -87,11 +99,13 @@ bool CameraBuffers::release(DiagnosticErrorPtr* error) {
 }
 
 int CameraBuffers::dequeue(DequeuedBuffer& buffer) {
-  v4l2_buffer taken = bufferOf(0);
-  const int result = node_->call(VIDIOC_DQBUF, &taken);
+  BufferCall call(*this);
+  const v4l2_buffer& taken = call.buffer;
+  const int result = node_->call(VIDIOC_DQBUF, &call.buffer);
   if (result != 0) return result;
   buffer.index = taken.index;
-  buffer.bytesUsed = taken.bytesused;
+  buffer.bytesUsed = taken.bytesused;  // 0 for a multi-planar node
+  for (const v4l2_plane& plane : call.planes) buffer.bytesUsed += plane.bytesused;
   buffer.sequence = taken.sequence;
   buffer.isBad = (taken.flags & V4L2_BUF_FLAG_ERROR) != 0;
   // If the driver does not use the monotonic clock, the time of dequeuing is the best approximation.
@@ -101,8 +115,8 @@ int CameraBuffers::dequeue(DequeuedBuffer& buffer) {
 }
 
 std::span<const std::uint8_t> CameraBuffers::contents(const DequeuedBuffer& buffer) const {
-  if (buffer.index >= mapped_.size()) return {};
-  const Mapped& mapped = mapped_[buffer.index];
+  if (buffer.index >= mapped_.size() || mapped_[buffer.index].size() != 1) return {};
+  const Mapped& mapped = mapped_[buffer.index].front();
   return {static_cast<const std::uint8_t*>(mapped.address), std::min<std::size_t>(buffer.bytesUsed, mapped.length)};
 }
 
@@ -111,8 +125,8 @@ int CameraBuffers::queue(std::uint32_t index) {
   waiting.push_back(index);
   int result = 0;
   for (const std::uint32_t one : waiting) {
-    v4l2_buffer buffer = bufferOf(one);
-    result = node_->call(VIDIOC_QBUF, &buffer);
+    BufferCall call(*this, one);
+    result = node_->call(VIDIOC_QBUF, &call.buffer);
     if (result != 0) refused_.push_back(one);
   }
   return result;

@@ -35,12 +35,11 @@ std::optional<std::uint64_t> numberIn(const std::filesystem::path& file, Diagnos
   return std::nullopt;
 }
 
-std::optional<std::uint64_t> read(const ErrorCounterBinding& binding, const V4l2Device& node,
+std::optional<std::uint64_t> read(const ErrorCounterBinding& binding, const CameraControls& camera,
                                   DiagnosticErrorPtr* error) {
   if (binding.file) return numberIn(*binding.file, error);
-  const VideoControl* const control = node.control(binding.control.value_or(""), error);
-  if (control == nullptr) return std::nullopt;
-  const std::optional<std::int64_t> value = node.read(*control, error);
+  const std::optional<CameraControl> control = camera.control(binding.control.value_or(""), error);
+  const std::optional<std::int64_t> value = control ? control->read(error) : std::nullopt;
   if (!value) return std::nullopt;
   return static_cast<std::uint64_t>(*value);
 }
@@ -69,19 +68,19 @@ std::int64_t frameOffset(const FrameCounts& camera, const FrameCounts& master, F
 }
 
 std::optional<BoundCounters> BoundCounters::begin(const std::vector<ErrorCounterBinding>& counters,
-                                                  const V4l2Device& node, DiagnosticErrorPtr* error) {
+                                                  const CameraControls& camera, DiagnosticErrorPtr* error) {
   BoundCounters begun;
   for (const ErrorCounterBinding& binding : counters) {
-    const std::optional<std::uint64_t> base = read(binding, node, error);
+    const std::optional<std::uint64_t> base = read(binding, camera, error);
     if (!base) return std::nullopt;
     begun.counters_.push_back({binding, *base});
   }
   return begun;
 }
 
-bool BoundCounters::addTo(Dictionary& dictionary, const V4l2Device& node, DiagnosticErrorPtr* error) const {
+bool BoundCounters::addTo(Dictionary& dictionary, const CameraControls& camera, DiagnosticErrorPtr* error) const {
   for (const Counter& counter : counters_) {
-    const std::optional<std::uint64_t> value = read(counter.binding, node, error);
+    const std::optional<std::uint64_t> value = read(counter.binding, camera, error);
     if (!value) return false;
     dictionary.set(counter.binding.name, *value >= counter.base ? *value - counter.base : *value);
   }

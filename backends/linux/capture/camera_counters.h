@@ -2,7 +2,7 @@
 #pragma once
 
 #include "backends/linux/binding/binding.h"
-#include "backends/linux/video/v4l2_device.h"
+#include "backends/linux/capture/camera_controls.h"
 #include "contract/diagnostic_error.h"
 #include "contract/value.h"
 
@@ -54,12 +54,12 @@ std::int64_t frameOffset(const FrameCounts& camera, const FrameCounts& master, F
 class BoundCounters final {
  public:
   // Reads the initial values, which are subtracted later. Returns nothing and an error if one cannot be read.
-  static std::optional<BoundCounters> begin(const std::vector<ErrorCounterBinding>& counters, const V4l2Device& node,
-                                            DiagnosticErrorPtr* error);
+  static std::optional<BoundCounters> begin(const std::vector<ErrorCounterBinding>& counters,
+                                            const CameraControls& camera, DiagnosticErrorPtr* error);
 
   // Adds the increments to the dictionary. A value below its initial value was reset and counts from 0. Returns false
   // and an error if one cannot be read.
-  bool addTo(Dictionary& dictionary, const V4l2Device& node, DiagnosticErrorPtr* error) const;
+  bool addTo(Dictionary& dictionary, const CameraControls& camera, DiagnosticErrorPtr* error) const;
 
  private:
   struct Counter {

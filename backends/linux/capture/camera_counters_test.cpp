@@ -77,7 +77,7 @@ class BoundCountersTest : public testing::Test {
   std::string grown(const BoundCounters& counters) {
     Dictionary values;
     DiagnosticErrorPtr error;
-    return counters.addTo(values, *node_, &error) ? defaultText(values) : error->localizedDescription();
+    return counters.addTo(values, CameraControls(node_), &error) ? defaultText(values) : error->localizedDescription();
   }
 
   std::shared_ptr<FakeV4l2Api> kernel_ = std::make_shared<FakeV4l2Api>();
@@ -88,7 +88,7 @@ class BoundCountersTest : public testing::Test {
 };
 
 TEST_F(BoundCountersTest, CountFromTheStartOfTheStream) {
-  const auto counters = BoundCounters::begin(bindings_, *node_, nullptr);
+  const auto counters = BoundCounters::begin(bindings_, CameraControls(node_), nullptr);
   ASSERT_TRUE(counters);
   EXPECT_EQ(grown(*counters), "{MIPIErrorCount = 0; I2CErrorCount = 0}");
   write("9\n");
@@ -99,10 +99,10 @@ TEST_F(BoundCountersTest, CountFromTheStartOfTheStream) {
 }
 
 TEST_F(BoundCountersTest, WhatCannotBeReadIsTold) {
-  const auto counters = BoundCounters::begin(bindings_, *node_, nullptr);
+  const auto counters = BoundCounters::begin(bindings_, CameraControls(node_), nullptr);
   ASSERT_TRUE(counters);
   const auto begin = [&] {
-    return outcome([&](auto* error) { return BoundCounters::begin(bindings_, *node_, error); });
+    return outcome([&](auto* error) { return BoundCounters::begin(bindings_, CameraControls(node_), error); });
   };
   write("many\n");
   EXPECT_EQ(begin(), "6 " + file_.string() + " has no number: many");
@@ -114,7 +114,7 @@ TEST_F(BoundCountersTest, WhatCannotBeReadIsTold) {
   kernel_->failNext(path_, VIDIOC_G_EXT_CTRLS, EIO);
   EXPECT_EQ(begin(), "1 VIDIOC_G_EXT_CTRLS of \"Errors\" on " + path_ + " failed: Input/output error (EIO)");
   EXPECT_EQ(outcome([&](auto* error) {
-              return BoundCounters::begin({{"A", {}, "None"}}, *node_, error);
+              return BoundCounters::begin({{"A", {}, "None"}}, CameraControls(node_), error);
             }),
             "5 " + path_ + " has no control \"None\".");
 }

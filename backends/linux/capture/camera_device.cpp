@@ -40,20 +40,34 @@ LinuxCamera::LinuxCamera(CameraBinding binding, std::shared_ptr<LinuxCameras> ca
     : binding_(std::move(binding)), info_(infoOf(binding_)), cameras_(std::move(cameras)) {}
 
 bool LinuxCamera::open(CameraSettings& settings, DiagnosticErrorPtr* error) {
-  const auto& [kernel, nodes] = std::tie(cameras_->kernel, cameras_->nodes);
-  node_ = openMatching(kernel, nodes, VideoNodeKind::kCamera, binding_.node, port(), error);
-  if (node_ != nullptr && binding_.metadata.node) {
-    metadataNode_ = openMatching(kernel, nodes, VideoNodeKind::kMetadata, *binding_.metadata.node, port(), error);
-    if (metadataNode_ == nullptr || !checkMetadata(*metadataNode_, error)) node_.reset();
-  }
-  if (node_ != nullptr && !node_->undescribedControls().empty()) {
-    logDefault("%@: the driver of %@ does not describe the controls %@; they cannot be used.", port(), node_->path(),
-               node_->undescribedControls());
-  }
-  const bool opened = node_ != nullptr && prepare(error);
+  const bool opened = openNodes(error) && node_->lockExclusive(error) && openControls(error) &&
+                      (!binding_.projector || controls_->set(binding_.projector->off, error)) &&
+                      controls_->set(binding_.controls, error);
   if (opened) settings.autoExposure = exposesAutomatically();
   if (!opened) close();
   return opened;
+}
+
+bool LinuxCamera::openNodes(DiagnosticErrorPtr* error) {
+  const auto& [kernel, nodes] = std::tie(cameras_->kernel, cameras_->nodes);
+  node_ = openMatching(kernel, nodes, VideoNodeKind::kCamera, binding_.node, port(), error);
+  if (node_ == nullptr || !binding_.metadata.node) return node_ != nullptr;
+  metadataNode_ = openMatching(kernel, nodes, VideoNodeKind::kMetadata, *binding_.metadata.node, port(), error);
+  return metadataNode_ != nullptr && checkMetadata(*metadataNode_, error);
+}
+
+bool LinuxCamera::openControls(DiagnosticErrorPtr* error) {
+  if (binding_.media) {
+    pipeline_ = MediaPipeline::open(cameras_->media, *binding_.media, port(), node_->path(), error);
+    if (pipeline_ == nullptr) return false;
+  }
+  using Subdevices = std::vector<std::shared_ptr<Subdevice>>;
+  controls_ = std::make_shared<CameraControls>(node_, pipeline_ ? pipeline_->subdevices() : Subdevices());
+  if (!controls_->undescribedControls().empty()) {
+    logDefault("%@: the driver of %@ does not describe the controls %@; they cannot be used.", port(), node_->path(),
+               controls_->undescribedControls());
+  }
+  return true;
 }
 
 // The fields must fit the format of the metadata node. A driver that does not report its format is believed.
@@ -75,21 +89,18 @@ bool LinuxCamera::checkMetadata(const V4l2Device& node, DiagnosticErrorPtr* erro
   return true;
 }
 
-bool LinuxCamera::prepare(DiagnosticErrorPtr* error) {
-  return node_->lockExclusive(error) && (!binding_.projector || node_->set(binding_.projector->off, error)) &&
-         node_->set(binding_.controls, error);
-}
-
 // A control that cannot be read is taken for automatic: nothing shows that it is off.
 bool LinuxCamera::exposesAutomatically() const {
-  const VideoControl* const control = node_->controlOfId(V4L2_CID_EXPOSURE_AUTO);
-  if (control == nullptr) return node_->mayHaveControl(V4L2_CID_EXPOSURE_AUTO);
-  return node_->read(*control, nullptr).value_or(V4L2_EXPOSURE_AUTO) != V4L2_EXPOSURE_MANUAL;
+  const std::optional<CameraControl> control = controls_->controlOfId(V4L2_CID_EXPOSURE_AUTO);
+  if (!control) return controls_->mayHaveControl(V4L2_CID_EXPOSURE_AUTO);
+  return control->read(nullptr).value_or(V4L2_EXPOSURE_AUTO) != V4L2_EXPOSURE_MANUAL;
 }
 
 void LinuxCamera::close() {
-  node_.reset();
+  controls_.reset();
+  pipeline_.reset();
   metadataNode_.reset();
+  node_.reset();
 }
 
 // The entry of the binding for the format index; null if the index is the driver's own.
@@ -143,7 +154,7 @@ std::optional<FrameInterval> LinuxCamera::intervalOf(const CameraSettings& setti
   }
   const VideoMode mode = modeOf(settings);
   const RateRequest request{port(), mode.index, mode.width, mode.height, wanted, bound.has_value()};
-  const std::optional<FrameInterval> given = setRate(*node_, request, error);
+  const std::optional<FrameInterval> given = setRate(*node_, *controls_, request, error);
   if (!given || fits(*given)) return given;
   refuseLinux(
       error, LinuxErrorCode::kNotSupported,
@@ -155,34 +166,36 @@ std::optional<FrameInterval> LinuxCamera::intervalOf(const CameraSettings& setti
 
 bool LinuxCamera::applyAutoExposure(const CameraSettings& wanted, DiagnosticErrorPtr* error) {
   const bool isAutomatic = *wanted.autoExposure.boolean();
-  const VideoControl* const control = node_->controlOfId(V4L2_CID_EXPOSURE_AUTO);
-  if (control == nullptr && node_->mayHaveControl(V4L2_CID_EXPOSURE_AUTO)) {
+  const std::optional<CameraControl> control = controls_->controlOfId(V4L2_CID_EXPOSURE_AUTO);
+  if (!control && controls_->mayHaveControl(V4L2_CID_EXPOSURE_AUTO)) {
     return refuseLinux(
         error, LinuxErrorCode::kNotSupported,
         "%@: automatic exposure of %@ cannot be set, because its driver does not describe the controls %@.", port(),
-        node_->path(), node_->undescribedControls());
+        node_->path(), controls_->undescribedControls());
   }
-  if (control == nullptr && isAutomatic) {
+  if (!control && isAutomatic) {
     return refuseLinux(error, LinuxErrorCode::kNotSupported, "%@: %@ has no automatic exposure.", port(),
                        node_->path());
   }
-  if (control != nullptr) {
+  if (control) {
     // Cameras support different automatic modes. The driver's default is one that this camera supports.
     constexpr std::int64_t kManual = V4L2_EXPOSURE_MANUAL;
     constexpr std::int64_t kAutomatic = V4L2_EXPOSURE_AUTO;
-    const std::int64_t automatic = control->defaultValue == kManual ? kAutomatic : control->defaultValue;
-    return node_->set(*control, isAutomatic ? automatic : kManual, error);
+    const std::int64_t automatic =
+        control->control.defaultValue == kManual ? kAutomatic : control->control.defaultValue;
+    return control->set(isAutomatic ? automatic : kManual, error);
   }
   return true;
 }
 
 bool LinuxCamera::checkLightSource(const CameraSettings& wanted, DiagnosticErrorPtr* error) {
   for (const ControlSetting& setting : lightOf(wanted.lightSource)) {
-    const VideoControl* const control = node_->control(setting.control, error);
-    if (control == nullptr) return false;
-    if (!takes(*control, setting.value)) {
+    const std::optional<CameraControl> found = controls_->control(setting.control, error);
+    if (!found) return false;
+    const VideoControl& control = found->control;
+    if (!takes(control, setting.value)) {
       return refuseLinux(error, LinuxErrorCode::kBadValue, "%@: the control \"%@\" accepts %@ to %@, not %@.", port(),
-                         control->name, control->minimum, control->maximum, setting.value);
+                         control.name, control.minimum, control.maximum, setting.value);
     }
   }
   return true;
@@ -216,6 +229,7 @@ std::optional<SessionCount> LinuxCamera::sessionCount(const CaptureRun* run, con
 }
 
 std::shared_ptr<CameraRun> LinuxCamera::begin(const CameraSettings& settings, DiagnosticErrorPtr* error) {
+  if (pipeline_ != nullptr && !pipeline_->prepare(error)) return nullptr;
   if (!applyFormat(settings, error)) return nullptr;
   const std::optional<FrameInterval> interval = intervalOf(settings, error);
   if (!interval) return nullptr;
@@ -226,6 +240,7 @@ std::shared_ptr<CameraRun> LinuxCamera::begin(const CameraSettings& settings, Di
   plan.light = lightOf(settings.lightSource);
   plan.node = node_;
   plan.metadataNode = metadataNode_;
+  plan.controls = controls_;
   if (const auto found = cameras_->traced.find(port()); found != cameras_->traced.end()) plan.traced = found->second;
   auto begun = std::make_shared<CameraRun>(std::move(plan), cameras_->delivered);
   return begun->begin(error) ? begun : nullptr;

@@ -12,21 +12,21 @@ std::optional<std::uint64_t> fieldIn(std::span<const std::uint8_t> buffer, const
   return number >> field.shift & field.mask.value_or(~std::uint64_t{0});
 }
 
-std::unique_ptr<CameraMetadata> CameraMetadata::make(const MetadataBinding& binding, const V4l2Device& camera,
+std::unique_ptr<CameraMetadata> CameraMetadata::make(const MetadataBinding& binding, const CameraControls& camera,
                                                      DiagnosticErrorPtr* error) {
   std::unique_ptr<CameraMetadata> metadata(new CameraMetadata(binding));
   for (const MetadataControl& one : binding.controls) {
-    const VideoControl* const control = camera.control(one.control, error);
-    if (control == nullptr) return nullptr;
-    metadata->controls_.push_back({one.key, *control});
+    std::optional<CameraControl> control = camera.control(one.control, error);
+    if (!control) return nullptr;
+    metadata->controls_.push_back({one.key, std::move(*control)});
   }
   return metadata;
 }
 
-Dictionary CameraMetadata::readControls(const V4l2Device& camera) const {
+Dictionary CameraMetadata::readControls() const {
   Dictionary values;
   for (const Control& one : controls_) {
-    if (const std::optional<std::int64_t> value = camera.read(one.control, nullptr)) values.set(one.key, *value);
+    if (const std::optional<std::int64_t> value = one.control.read(nullptr)) values.set(one.key, *value);
   }
   return values;
 }

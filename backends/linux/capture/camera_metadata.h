@@ -2,8 +2,8 @@
 #pragma once
 
 #include "backends/linux/binding/binding.h"
+#include "backends/linux/capture/camera_controls.h"
 #include "backends/linux/capture/camera_pairing.h"
-#include "backends/linux/video/v4l2_device.h"
 #include "contract/value.h"
 
 #include <cstdint>
@@ -21,11 +21,11 @@ std::optional<std::uint64_t> fieldIn(std::span<const std::uint8_t> buffer, const
 class CameraMetadata final {
  public:
   // Returns null and an error if the binding names a control that the camera does not have.
-  static std::unique_ptr<CameraMetadata> make(const MetadataBinding& binding, const V4l2Device& camera,
+  static std::unique_ptr<CameraMetadata> make(const MetadataBinding& binding, const CameraControls& camera,
                                               DiagnosticErrorPtr* error);
 
   // The controls that are read with every frame; omits those that cannot be read.
-  Dictionary readControls(const V4l2Device& camera) const;
+  Dictionary readControls() const;
 
   // The frame's dictionary: constants, then fields, then controls. Omits the key of a missing field or control, even if
   // a constant has the same key, and then sets `complete` to false.
@@ -34,7 +34,7 @@ class CameraMetadata final {
  private:
   struct Control {
     std::string key;
-    VideoControl control;
+    CameraControl control;
   };
 
   explicit CameraMetadata(const MetadataBinding& binding) : binding_(binding) {}

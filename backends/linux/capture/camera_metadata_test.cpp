@@ -41,7 +41,7 @@ class CameraMetadataNodeTest : public testing::Test {
 
   std::string made(const CapturedFrame& frame, bool wantComplete) {
     bool complete = !wantComplete;
-    const auto metadata = CameraMetadata::make(binding_, *node_, nullptr);
+    const auto metadata = CameraMetadata::make(binding_, CameraControls(node_), nullptr);
     const std::string text = defaultText(metadata->dictionaryOf(frame, &complete));
     EXPECT_EQ(complete, wantComplete);
     return text;
@@ -56,7 +56,7 @@ class CameraMetadataNodeTest : public testing::Test {
 TEST_F(CameraMetadataNodeTest, TheLaterOfConstantsFieldsAndControlsHolds) {
   CapturedFrame frame;
   frame.paired = {20, 30};
-  frame.controls = CameraMetadata::make(binding_, *node_, nullptr)->readControls(*node_);
+  frame.controls = CameraMetadata::make(binding_, CameraControls(node_), nullptr)->readControls();
   EXPECT_EQ(made(frame, true), "{A = 1; B = 20; C = 3; D = 12}");
 }
 
@@ -68,13 +68,13 @@ TEST_F(CameraMetadataNodeTest, WhatDidNotComeIsLeftOutEvenWhereAConstantHasTheKe
   EXPECT_EQ(made(frame, false), "{A = 1; B = 20; C = 3; D = 12}") << "a short buffer";
   frame.paired = {20, 30};
   kernel_->failNext(path_, VIDIOC_G_EXT_CTRLS, EIO);
-  frame.controls = CameraMetadata::make(binding_, *node_, nullptr)->readControls(*node_);
+  frame.controls = CameraMetadata::make(binding_, CameraControls(node_), nullptr)->readControls();
   EXPECT_EQ(made(frame, false), "{A = 1; B = 20; C = 3}") << "a control that could not be read";
 }
 
 TEST_F(CameraMetadataNodeTest, AControlThatTheCameraDoesNotHaveIsRefused) {
   binding_.controls = {{"D", "Darkness"}};
-  EXPECT_EQ(outcome([&](auto* error) { return CameraMetadata::make(binding_, *node_, error); }),
+  EXPECT_EQ(outcome([&](auto* error) { return CameraMetadata::make(binding_, CameraControls(node_), error); }),
             "5 " + path_ + " has no control \"Darkness\".");
 }
 

@@ -12,6 +12,7 @@ namespace {
 double rounded(double rate) { return std::round(rate * 1000) / 1000; }
 
 // A sensor reads width + horizontal blanking pixels a line, and height + vertical blanking lines a frame.
+// `request` has its size.
 std::optional<FrameInterval> setBlanking(V4l2Device& camera, const RateRequest& request, DiagnosticErrorPtr* error) {
   const std::optional<VideoControl> vertical = camera.describe(V4L2_CID_VBLANK, error);
   if (!vertical) return std::nullopt;
@@ -46,7 +47,8 @@ FrameInterval intervalFor(double framesPerSecond) {
   return {1000, static_cast<std::uint32_t>(std::lround(framesPerSecond * 1000))};
 }
 
-std::optional<FrameInterval> setRate(V4l2Device& camera, const RateRequest& request, DiagnosticErrorPtr* error) {
+std::optional<FrameInterval> setRate(V4l2Device& camera, const CameraControls& controls, const RateRequest& request,
+                                     DiagnosticErrorPtr* error) {
   FrameInterval interval = request.interval;
   const int result = camera.setInterval(&interval);
   if (result == 0) return interval;
@@ -55,9 +57,17 @@ std::optional<FrameInterval> setRate(V4l2Device& camera, const RateRequest& requ
     return std::nullopt;
   }
   if (request.isOfBinding) return interval;
-  constexpr std::uint32_t kNeeded[] = {V4L2_CID_VBLANK, V4L2_CID_HBLANK, V4L2_CID_PIXEL_RATE};
-  const auto isThere = [&](std::uint32_t id) { return camera.controlOfId(id) != nullptr; };
-  if (std::ranges::all_of(kNeeded, isThere)) return setBlanking(camera, request, error);
+  const auto sensor = controls.deviceWith({V4L2_CID_VBLANK, V4L2_CID_HBLANK, V4L2_CID_PIXEL_RATE});
+  if (sensor != nullptr) {
+    RateRequest ofSensor = request;
+    if (const Subdevice* const subdevice = controls.subdeviceOf(*sensor)) {
+      const std::optional<PadFormat> format = subdevice->format(0, error);
+      if (!format) return std::nullopt;
+      ofSensor.width = format->width;
+      ofSensor.height = format->height;
+    }
+    return setBlanking(*sensor, ofSensor, error);
+  }
   refuseLinux(error, LinuxErrorCode::kNotSupported,
               "%@: the frame rate of %@ cannot be set: its driver has neither VIDIOC_S_PARM nor controls for blanking "
               "and pixel rate. If its rate is fixed or set by other controls, give the \"interval\" of format index %@ "

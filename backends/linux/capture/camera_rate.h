@@ -1,6 +1,7 @@
 // The rate of a camera: by the driver's intervals, or by the blanking of its sensor.
 #pragma once
 
+#include "backends/linux/capture/camera_controls.h"
 #include "backends/linux/video/v4l2_device.h"
 #include "contract/diagnostic_error.h"
 
@@ -29,6 +30,7 @@ struct RateRequest {
 // Requests the interval and returns the one that the driver has set, which may differ. If the driver sets no intervals,
 // an interval of the binding is believed; without one, the sensor's vertical blanking is set. Returns nothing and an
 // error if all that fails.
-std::optional<FrameInterval> setRate(V4l2Device& camera, const RateRequest& request, DiagnosticErrorPtr* error);
+std::optional<FrameInterval> setRate(V4l2Device& camera, const CameraControls& controls, const RateRequest& request,
+                                     DiagnosticErrorPtr* error);
 
 }  // namespace quazor

@@ -4,6 +4,7 @@
 #include "backends/linux/system/linux_error.h"
 #include "contract/log_channel.h"
 
+#include <algorithm>
 #include <cerrno>
 #include <string_view>
 #include <utility>
@@ -36,7 +37,8 @@ CameraRun::CameraRun(CameraRunPlan plan, std::shared_ptr<DeliveredFrames> delive
       pairing_(pairingOf(camera_.metadata, *plan.node)),
       handler_(std::move(plan.handler)),
       node_(std::move(plan.node)),
-      metadataNode_(handler_ == nullptr ? nullptr : std::move(plan.metadataNode)) {
+      metadataNode_(handler_ == nullptr ? nullptr : std::move(plan.metadataNode)),
+      controls_(std::move(plan.controls)) {
   if (metadataNode_ == nullptr) pairing_.endMetadata();
 }
 
@@ -49,44 +51,52 @@ bool CameraRun::begin(DiagnosticErrorPtr* error) {
 }
 
 bool CameraRun::enableProjector(DiagnosticErrorPtr* error) {
-  if (light_.empty()) return true;
-  std::vector<ControlValue> off;
-  for (const ControlSetting& setting : camera_.projector->off) {
-    const VideoControl* const control = node_->control(setting.control, error);
-    if (control == nullptr) return false;
-    off.push_back(valueFor(*control, setting.value));
-  }
-  int number = 0;
-  guard_ = node_->kernel().guardControls(node_->path(), node_->descriptor(), off, &number);
-  if (guard_ == nullptr) {
-    failSystemCall(error, "guarding the projector", node_->path(), number);
-    return false;
-  }
-  return node_->set(light_, error);
+  return light_.empty() || (startGuards(error) && controls_->set(light_, error));
 }
 
-// Destroying the guard also switches the projector off.
+bool CameraRun::startGuards(DiagnosticErrorPtr* error) {
+  std::vector<std::pair<std::shared_ptr<V4l2Device>, std::vector<ControlValue>>> off;
+  for (const ControlSetting& setting : camera_.projector->off) {
+    const std::optional<CameraControl> found = controls_->control(setting.control, error);
+    if (!found) return false;
+    auto device = std::ranges::find(off, found->device, [](const auto& one) { return one.first; });
+    if (device == off.end()) device = off.insert(off.end(), {found->device, {}});
+    device->second.push_back(valueFor(found->control, setting.value));
+  }
+  for (const auto& [device, values] : off) {
+    int number = 0;
+    auto guard = device->kernel().guardControls(device->path(), device->descriptor(), values, &number);
+    if (guard == nullptr) {
+      failSystemCall(error, "guarding the projector", device->path(), number);
+      return false;
+    }
+    guards_.push_back(std::move(guard));
+  }
+  return true;
+}
+
+// Destroying the guards also switches the projector off.
 bool CameraRun::disableProjector(DiagnosticErrorPtr* error) {
-  if (guard_ == nullptr) return true;
-  const bool dark = node_->set(camera_.projector->off, error);
-  guard_.reset();
+  if (guards_.empty()) return true;
+  const bool dark = controls_->set(camera_.projector->off, error);
+  guards_.clear();
   return dark;
 }
 
 bool CameraRun::prepare(DiagnosticErrorPtr* error) {
   {
     const std::lock_guard lock(mutex_);
-    bound_ = BoundCounters::begin(camera_.errorCounters, *node_, error);
+    bound_ = BoundCounters::begin(camera_.errorCounters, *controls_, error);
     if (!bound_) return false;
   }
   if (handler_ != nullptr) {
-    contents_ = CameraMetadata::make(camera_.metadata, *node_, error);
+    contents_ = CameraMetadata::make(camera_.metadata, *controls_, error);
     if (contents_ == nullptr) return false;
   }
-  video_ = std::make_unique<CameraBuffers>(node_, V4L2_BUF_TYPE_VIDEO_CAPTURE);
+  video_ = std::make_unique<CameraBuffers>(node_);
   if (!video_->prepare(camera_.buffers, error)) return false;
   if (metadataNode_ != nullptr) {
-    metadata_ = std::make_unique<CameraBuffers>(metadataNode_, V4L2_BUF_TYPE_META_CAPTURE);
+    metadata_ = std::make_unique<CameraBuffers>(metadataNode_);
     if (!metadata_->prepare(camera_.buffers, error) || !metadata_->streamOn(error)) return false;
   }
   return video_->streamOn(error);
@@ -106,6 +116,8 @@ bool CameraRun::end(DiagnosticErrorPtr* error) {
   video_.reset();
   metadata_.reset();
   metadataNode_.reset();
+  contents_.reset();
+  controls_.reset();
   node_.reset();
   return succeeded;
 }
@@ -124,7 +136,7 @@ std::optional<Dictionary> CameraRun::errorCounters(DiagnosticErrorPtr* error) co
 
 std::optional<Dictionary> CameraRun::counters(DiagnosticErrorPtr* error) const {
   Dictionary counters = errorCountersOf(camera_.errorCounters);
-  if (bound_ && !bound_->addTo(counters, *node_, error)) return std::nullopt;
+  if (bound_ && !bound_->addTo(counters, *controls_, error)) return std::nullopt;
   addKernelCounters(counters, counts_);
   return counters;
 }
@@ -197,7 +209,7 @@ void CameraRun::takeFrame(const DequeuedBuffer& buffer) {
   CapturedFrame frame;
   frame.timestamp = buffer.timestamp;
   frame.sequence = buffer.sequence;
-  frame.controls = contents_->readControls(*node_);
+  frame.controls = contents_->readControls();
   pairing_.addFrame(std::move(frame), node_->kernel().now());
 }
 

@@ -27,7 +27,8 @@ struct CameraRunPlan {
   std::vector<ControlSetting> light;            // set before the first frame; empty: the projector stays off
   std::shared_ptr<V4l2Device> node;
   std::shared_ptr<V4l2Device> metadataNode;  // may be null
-  std::shared_ptr<TracedStream> traced;      // of the camera; null: its frames are not traced
+  std::shared_ptr<const CameraControls> controls;
+  std::shared_ptr<TracedStream> traced;  // of the camera; null: its frames are not traced
 };
 
 // The number of frames passed to handlers, for all cameras.
@@ -59,6 +60,7 @@ class CameraRun final : public PolledStream, public CaptureRun {
  private:
   bool enableProjector(DiagnosticErrorPtr* error);
   bool disableProjector(DiagnosticErrorPtr* error);
+  bool startGuards(DiagnosticErrorPtr* error);
   bool prepare(DiagnosticErrorPtr* error);
   bool serveMetadata(const pollfd& polled);
   bool serveVideo(const pollfd& polled);
@@ -75,7 +77,7 @@ class CameraRun final : public PolledStream, public CaptureRun {
   const std::shared_ptr<TracedStream> traced_;
 
   std::unique_ptr<CameraMetadata> contents_;
-  std::unique_ptr<ControlGuard> guard_;
+  std::vector<std::unique_ptr<ControlGuard>> guards_;  // one for each device that has controls of the projector
   FramePairing pairing_;
   bool toldUnpaired_ = false;  // only the first frame without metadata is logged
 
@@ -83,6 +85,7 @@ class CameraRun final : public PolledStream, public CaptureRun {
   std::shared_ptr<PixelBufferHandler> handler_;
   std::shared_ptr<V4l2Device> node_;
   std::shared_ptr<V4l2Device> metadataNode_;
+  std::shared_ptr<const CameraControls> controls_;
   std::unique_ptr<CameraBuffers> video_;
   std::unique_ptr<CameraBuffers> metadata_;
 

@@ -79,9 +79,11 @@ inline Binding fakeBinding() {
 
 class FakeCameras {
  public:
-  explicit FakeCameras(Binding used = fakeBinding()) : binding(std::move(used)) {
+  // `make` makes the node of the camera at a bus.
+  explicit FakeCameras(Binding used = fakeBinding(), FakeNode (*make)(const std::string& bus) = &fakeCamera)
+      : binding(std::move(used)) {
     for (int i = 0; i < 4; ++i) {
-      FakeNode node = fakeCamera("fake:" + std::to_string(i));
+      FakeNode node = make("fake:" + std::to_string(i));
       if (i == 3) {
         node.controls = {{kStrobe, "Strobe", 0, 2, 2}, {kPower, "Power", 0, 100, 5}};
         node.metadata = {1, 2, 3, 4};

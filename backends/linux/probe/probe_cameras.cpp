@@ -1,5 +1,6 @@
 #include "backends/linux/probe/probe_cameras.h"
 
+#include "backends/linux/probe/probe_media.h"
 #include "backends/linux/system/linux_error.h"
 #include "contract/message_format.h"
 #include "platform/capture_keys.h"
@@ -173,7 +174,7 @@ Json formatEntry(const ChosenMode& mode) {
 class CameraProbe {
  public:
   CameraProbe(const std::shared_ptr<V4l2Api>& kernel, const DeviceRoots& roots, std::vector<std::string>* lines)
-      : kernel_(kernel), nodes_(videoNodes(kernel, roots)), lines_(lines) {}
+      : kernel_(kernel), nodes_(videoNodes(kernel, roots)), media_(kernel, roots), lines_(lines) {}
 
   Json run() {
     if (nodes_.empty()) {
@@ -188,7 +189,7 @@ class CameraProbe {
       } else if (node.kind == VideoNodeKind::kMetadata) {
         tellMetadata(node);
       } else {
-        tell("    unsuitable: it does not capture video to mapped buffers, or uses several planes");
+        tell("    unsuitable: it does not capture video to mapped buffers");
       }
     }
     return std::move(cameras_);
@@ -208,23 +209,22 @@ class CameraProbe {
     DiagnosticErrorPtr error;
     const std::optional<VideoNodeDetails> details = detailsOf(kernel_, node, &error);
     if (!details) return tellProblem(*error);
-    const std::optional<VideoNodeMatch> match = matchOf(node);
     const std::vector<VideoFormat>& formats = details->formats;
     const bool isTaken = cameras_.size() == kPorts.size();
-    const auto mode = modeFor(isTaken ? 0 : kPorts.at(cameras_.size()).formatIndex, formats);
-    if (!mode) {
-      tell("    unsuitable: its driver reports no format, or no usable size");
-    } else if (node.driver.empty() && node.card.empty() && node.busInfo.empty()) {
-      tell("    unsuitable: its driver reports nothing that a binding could use to identify it");
-    } else if (!match) {
-      tell(
-          "    unsuitable: another camera has the same driver, card, bus and device, so a binding cannot distinguish "
-          "them");
-    } else if (isTaken) {
-      tell("    suitable, but all ports are taken; use it instead of another camera in the binding below");
+    std::optional<ChosenMode> mode;
+    std::optional<ProbedPath> path;
+    std::string reason = "its driver reports no format, or no usable size";
+    if (media_.isBehindLinks(node)) {
+      path = media_.pathTo(node, &reason);
+      if (path && contradicts(path->media.links)) {
+        reason = "its links contradict those of another camera in the binding below";
+        path.reset();
+      }
+      if (path) mode = modeOf(*path);
     } else {
-      bind(*match, *mode, formats);
+      mode = modeFor(isTaken ? 0 : kPorts.at(cameras_.size()).formatIndex, formats);
     }
+    tellUse(node, mode, path, formats, reason);
     if (mode && !mode->hasDefaultRate) {
       tell("    Its formats have no size at 30 frames a second, the rate that the camera diagnostics use.");
     }
@@ -235,8 +235,41 @@ class CameraProbe {
     }
   }
 
-  // The shortest match that selects only this camera: what the driver reports, then the USB interface, then the place
-  // in sysfs. Nothing if there is none.
+  // A path fits only the size of its pads. Its rate is believed if nothing sets it.
+  static ChosenMode modeOf(const ProbedPath& path) {
+    ChosenMode mode{&path.format, path.width, path.height, {}, true};
+    if (!path.hasRate) mode.interval = FrameInterval{1, static_cast<std::uint32_t>(kDefaultRate)};
+    return mode;
+  }
+
+  bool contradicts(const std::vector<LinkBinding>& links) const {
+    return std::ranges::any_of(links, [this](LinkBinding link) {
+      link.enabled = !link.enabled;
+      return std::ranges::find(links_, link) != links_.end();
+    });
+  }
+
+  void tellUse(const V4l2DeviceInfo& node, const std::optional<ChosenMode>& mode, const std::optional<ProbedPath>& path,
+               const std::vector<VideoFormat>& formats, const std::string& reason) {
+    const std::optional<VideoNodeMatch> match = matchOf(node);
+    const bool isTaken = cameras_.size() == kPorts.size();
+    if (!mode) {
+      tell("    unsuitable: " + reason);
+    } else if (node.driver.empty() && node.card.empty() && node.busInfo.empty()) {
+      tell("    unsuitable: its driver reports nothing that a binding could use to identify it");
+    } else if (!match) {
+      tell(
+          "    unsuitable: another camera has the same driver, card, bus and device, so a binding cannot distinguish "
+          "them");
+    } else if (isTaken) {
+      tell("    suitable, but all ports are taken; use it instead of another camera in the binding below");
+    } else {
+      bind(*match, *mode, path, formats);
+    }
+  }
+
+  // The shortest match that selects only this camera: what the driver reports, then the USB interface, then the name of
+  // the node, then the place in sysfs. Nothing if there is none.
   std::optional<VideoNodeMatch> matchOf(const V4l2DeviceInfo& node) const {
     const auto textIn = [](const std::string& text) { return text.empty() ? std::nullopt : std::optional(text); };
     VideoNodeMatch match{textIn(node.driver), textIn(node.card), textIn(node.busInfo), {}, {}};
@@ -248,11 +281,15 @@ class CameraProbe {
     if (isOnly()) return match;
     match.usbInterface = node.usbInterface;
     if (isOnly()) return match;
+    match.name = textIn(node.systemName);
+    if (isOnly()) return match;
+    match.name.reset();
     match.path = textIn(node.device);
     return isOnly() ? std::optional(match) : std::nullopt;
   }
 
-  void bind(const VideoNodeMatch& node, const ChosenMode& mode, const std::vector<VideoFormat>& formats) {
+  void bind(const VideoNodeMatch& node, const ChosenMode& mode, const std::optional<ProbedPath>& path,
+            const std::vector<VideoFormat>& formats) {
     const auto [port, formatIndex] = kPorts.at(cameras_.size());
     tell("    suitable: " + std::string(port) + " in the binding below; check which camera it really is");
     Json match = Json::object();
@@ -260,14 +297,24 @@ class CameraProbe {
     if (node.card) match["card"] = *node.card;
     if (node.busInfo) match["busInfo"] = *node.busInfo;
     if (node.usbInterface) match["usbInterface"] = *node.usbInterface;
+    if (node.name) match["name"] = *node.name;
     if (node.path) match["path"] = *node.path;
     Json camera = {{"node", std::move(match)}, {"size", sizeEntry(mode)}};
     // Index 0 is that of a stream whose format was never set.
     for (const std::uint32_t index : std::set{std::uint32_t{0}, formatIndex}) {
-      if (isDriversOwn(index, mode, formats) || !canBeNamed(*mode.format)) continue;
+      if ((!path && isDriversOwn(index, mode, formats)) || !canBeNamed(*mode.format)) continue;
       camera["formats"][std::to_string(index)] = formatEntry(mode);
       tell(formatMessage("    format index %@ of the diagnostics: %@ of %@x%@", index, mode.format->fourcc, mode.width,
                          mode.height));
+    }
+    if (path) {
+      tell("    Its frames come through a media controller, from " + path->text +
+           "; the binding below sets links and pads.");
+      if (!path->hasRate) {
+        tell("    Its driver reports no frame rate. The binding says 30 a second; correct its \"interval\"s.");
+      }
+      camera["media"] = mediaEntry(path->media);
+      links_.insert(links_.end(), path->media.links.begin(), path->media.links.end());
     }
     cameras_[std::string(port)] = std::move(camera);
   }
@@ -301,6 +348,8 @@ class CameraProbe {
 
   const std::shared_ptr<V4l2Api>& kernel_;
   const std::vector<V4l2DeviceInfo> nodes_;
+  const MediaProbe media_;
+  std::vector<LinkBinding> links_;  // of the cameras in the binding
   std::vector<std::string>* const lines_;
   Json cameras_ = Json::object();
 };

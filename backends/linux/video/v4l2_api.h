@@ -1,4 +1,4 @@
-// V4l2Api: the system calls of the capture service, replaceable by a fake driver.
+// V4l2Api: the system calls on video nodes and media controllers, replaceable by a fake driver.
 #pragma once
 
 #include <poll.h>

@@ -24,6 +24,33 @@ std::string fourccText(std::uint32_t fourcc) {
   return (fourcc & kBigEndian) == 0 ? text : text + "-BE";
 }
 
+// The part of a picture's format that single- and multi-planar nodes share.
+struct PictureFormat {
+  std::uint32_t width = 0;
+  std::uint32_t height = 0;
+  std::uint32_t fourcc = 0;
+
+  friend bool operator==(const PictureFormat&, const PictureFormat&) = default;
+};
+
+v4l2_format formatOf(const PictureFormat& picture, std::uint32_t type) {
+  v4l2_format format{};
+  format.type = type;
+  const auto fill = [&picture](auto& pixels) {
+    pixels.width = picture.width;
+    pixels.height = picture.height;
+    pixels.pixelformat = picture.fourcc;
+    pixels.field = V4L2_FIELD_ANY;
+  };
+  type == V4L2_BUF_TYPE_VIDEO_CAPTURE_MPLANE ? fill(format.fmt.pix_mp) : fill(format.fmt.pix);
+  return format;
+}
+
+PictureFormat pictureOf(const v4l2_format& format) {
+  const auto read = [](const auto& pixels) { return PictureFormat{pixels.width, pixels.height, pixels.pixelformat}; };
+  return format.type == V4L2_BUF_TYPE_VIDEO_CAPTURE_MPLANE ? read(format.fmt.pix_mp) : read(format.fmt.pix);
+}
+
 FrameInterval intervalOf(const v4l2_fract& fraction) { return {fraction.numerator, fraction.denominator}; }
 
 v4l2_ext_controls listOfOne(v4l2_ext_control& control) {
@@ -60,14 +87,17 @@ bool takes(const VideoControl& control, std::int64_t value) {
 
 ControlValue valueFor(const VideoControl& control, std::int64_t value) { return {control.id, value, is64Bit(control)}; }
 
+std::shared_ptr<V4l2Device> V4l2Device::made(std::shared_ptr<V4l2Api> kernel, const std::string& path, int descriptor,
+                                             DiagnosticErrorPtr* error) {
+  if (descriptor >= 0) return std::shared_ptr<V4l2Device>(new V4l2Device(std::move(kernel), path, descriptor));
+  failSystemCall(error, "open", path, -descriptor);
+  return nullptr;
+}
+
 std::shared_ptr<V4l2Device> V4l2Device::opened(std::shared_ptr<V4l2Api> kernel, const std::string& path, int descriptor,
                                                DiagnosticErrorPtr* error) {
-  if (descriptor < 0) {
-    failSystemCall(error, "open", path, -descriptor);
-    return nullptr;
-  }
-  std::shared_ptr<V4l2Device> node(new V4l2Device(std::move(kernel), path, descriptor));
-  return node->call(VIDIOC_QUERYCAP, "VIDIOC_QUERYCAP", &node->capability_, error) ? node : nullptr;
+  std::shared_ptr<V4l2Device> node = made(std::move(kernel), path, descriptor, error);
+  return node != nullptr && node->call(VIDIOC_QUERYCAP, "VIDIOC_QUERYCAP", &node->capability_, error) ? node : nullptr;
 }
 
 std::shared_ptr<V4l2Device> V4l2Device::open(std::shared_ptr<V4l2Api> kernel, const std::string& path,
@@ -91,6 +121,14 @@ std::shared_ptr<V4l2Device> V4l2Device::open(std::shared_ptr<V4l2Api> kernel, co
   return nullptr;
 }
 
+std::shared_ptr<V4l2Device> V4l2Device::openSubdevice(std::shared_ptr<V4l2Api> kernel, const std::string& path,
+                                                      DiagnosticErrorPtr* error) {
+  const int descriptor = kernel->open(path);
+  std::shared_ptr<V4l2Device> subdevice = made(std::move(kernel), path, descriptor, error);
+  if (subdevice != nullptr) subdevice->listControls();
+  return subdevice;
+}
+
 std::shared_ptr<V4l2Device> V4l2Device::inspect(std::shared_ptr<V4l2Api> kernel, const std::string& path,
                                                 DiagnosticErrorPtr* error) {
   const int descriptor = kernel->openForQueries(path);
@@ -110,8 +148,14 @@ std::uint32_t V4l2Device::capabilities() const {
 VideoNodeKind V4l2Device::kind() const {
   const std::uint32_t capabilities = this->capabilities();
   if ((capabilities & V4L2_CAP_STREAMING) == 0) return VideoNodeKind::kOther;
-  if ((capabilities & V4L2_CAP_VIDEO_CAPTURE) != 0) return VideoNodeKind::kCamera;
+  if ((capabilities & (V4L2_CAP_VIDEO_CAPTURE | V4L2_CAP_VIDEO_CAPTURE_MPLANE)) != 0) return VideoNodeKind::kCamera;
   return (capabilities & V4L2_CAP_META_CAPTURE) != 0 ? VideoNodeKind::kMetadata : VideoNodeKind::kOther;
+}
+
+std::uint32_t V4l2Device::bufferType() const {
+  if (kind() == VideoNodeKind::kMetadata) return V4L2_BUF_TYPE_META_CAPTURE;
+  const bool isSinglePlanar = (capabilities() & V4L2_CAP_VIDEO_CAPTURE) != 0;
+  return isSinglePlanar ? V4L2_BUF_TYPE_VIDEO_CAPTURE : V4L2_BUF_TYPE_VIDEO_CAPTURE_MPLANE;
 }
 
 bool V4l2Device::lockExclusive(DiagnosticErrorPtr* error) {
@@ -125,13 +169,14 @@ bool V4l2Device::lockExclusive(DiagnosticErrorPtr* error) {
   return false;
 }
 
-std::vector<VideoFormat> V4l2Device::formats() const {
+std::vector<VideoFormat> V4l2Device::formats(std::uint32_t mediaBusCode) const {
   std::vector<VideoFormat> formats;
   const bool isCamera = kind() == VideoNodeKind::kCamera;
   for (std::uint32_t index = 0; index < kMaxItems; ++index) {
     v4l2_fmtdesc description{};
     description.index = index;
-    description.type = isCamera ? V4L2_BUF_TYPE_VIDEO_CAPTURE : V4L2_BUF_TYPE_META_CAPTURE;
+    description.type = bufferType();
+    description.mbus_code = mediaBusCode;
     if (call(VIDIOC_ENUM_FMT, &description) != 0) break;
     VideoFormat format{index, fourccText(description.pixelformat), fixedText(description.description), {}};
     if (isCamera) format.sizes = sizesOf(description.pixelformat);
@@ -185,7 +230,7 @@ std::optional<std::uint32_t> V4l2Device::pixelFormatOf(const VideoMode& mode, Di
   for (std::uint32_t index = 0; index < kMaxItems; ++index) {
     v4l2_fmtdesc description{};
     description.index = index;
-    description.type = V4L2_BUF_TYPE_VIDEO_CAPTURE;
+    description.type = bufferType();
     const int result = call(VIDIOC_ENUM_FMT, &description);
     if (result == EINVAL) break;
     if (result != 0) {
@@ -212,23 +257,20 @@ std::optional<std::uint32_t> V4l2Device::pixelFormatOf(const VideoMode& mode, Di
 bool V4l2Device::setFormat(const VideoMode& mode, DiagnosticErrorPtr* error) {
   const std::optional<std::uint32_t> fourcc = pixelFormatOf(mode, error);
   if (!fourcc) return false;
-  v4l2_format wanted{};
-  wanted.type = V4L2_BUF_TYPE_VIDEO_CAPTURE;
-  wanted.fmt.pix.width = mode.width;
-  wanted.fmt.pix.height = mode.height;
-  wanted.fmt.pix.pixelformat = *fourcc;
-  wanted.fmt.pix.field = V4L2_FIELD_ANY;
+  const PictureFormat picture{mode.width, mode.height, *fourcc};
+  v4l2_format wanted = formatOf(picture, bufferType());
   // VIDIOC_S_FMT may return another format than VIDIOC_TRY_FMT if other settings of the device changed in between.
-  const auto isGranted = [&](const v4l2_pix_format& given) {
-    if (given.width == mode.width && given.height == mode.height && given.pixelformat == *fourcc) return true;
+  const auto isGranted = [&](const v4l2_format& format) {
+    const PictureFormat given = pictureOf(format);
+    if (given == picture) return true;
     return refuseLinux(error, LinuxErrorCode::kNotSupported,
                        "%@: format %@ (%@) of %@ x %@ is not available; the driver offers %@ of %@ x %@.", path_,
-                       mode.index, fourccText(*fourcc), mode.width, mode.height, fourccText(given.pixelformat),
-                       given.width, given.height);
+                       mode.index, fourccText(*fourcc), mode.width, mode.height, fourccText(given.fourcc), given.width,
+                       given.height);
   };
   v4l2_format offered = wanted;
-  return call(VIDIOC_TRY_FMT, "VIDIOC_TRY_FMT", &offered, error) && isGranted(offered.fmt.pix) &&
-         call(VIDIOC_S_FMT, "VIDIOC_S_FMT", &wanted, error) && isGranted(wanted.fmt.pix);
+  return call(VIDIOC_TRY_FMT, "VIDIOC_TRY_FMT", &offered, error) && isGranted(offered) &&
+         call(VIDIOC_S_FMT, "VIDIOC_S_FMT", &wanted, error) && isGranted(wanted);
 }
 
 std::optional<MetadataFormat> V4l2Device::metadataFormat() const {
@@ -240,14 +282,14 @@ std::optional<MetadataFormat> V4l2Device::metadataFormat() const {
 
 std::optional<FrameInterval> V4l2Device::interval(DiagnosticErrorPtr* error) const {
   v4l2_streamparm parameters{};
-  parameters.type = V4L2_BUF_TYPE_VIDEO_CAPTURE;
+  parameters.type = bufferType();
   if (!call(VIDIOC_G_PARM, "VIDIOC_G_PARM", &parameters, error)) return std::nullopt;
   return intervalOf(parameters.parm.capture.timeperframe);
 }
 
 int V4l2Device::setInterval(FrameInterval* interval) {
   v4l2_streamparm parameters{};
-  parameters.type = V4L2_BUF_TYPE_VIDEO_CAPTURE;
+  parameters.type = bufferType();
   parameters.parm.capture.timeperframe = {interval->numerator, interval->denominator};
   const int result = call(VIDIOC_S_PARM, &parameters);
   if (result == 0) *interval = intervalOf(parameters.parm.capture.timeperframe);
@@ -333,12 +375,15 @@ std::optional<VideoControl> V4l2Device::describe(std::uint32_t id, DiagnosticErr
   return std::nullopt;
 }
 
-const VideoControl* V4l2Device::control(std::string_view name, DiagnosticErrorPtr* error) const {
+const VideoControl* V4l2Device::findControl(std::string_view name) const {
   const auto found = std::ranges::find(controls_, name, &VideoControl::name);
   if (found != controls_.end()) return &*found;
   const std::optional<std::uint32_t> id = controlIdOf(name);
-  const VideoControl* const other = id ? controlOfId(*id) : nullptr;
-  if (other != nullptr) return other;
+  return id ? controlOfId(*id) : nullptr;
+}
+
+const VideoControl* V4l2Device::control(std::string_view name, DiagnosticErrorPtr* error) const {
+  if (const VideoControl* const found = findControl(name)) return found;
   const std::string undescribed = undescribedControls();
   refuseLinux(error, LinuxErrorCode::kNotSupported, "%@ has no control \"%@\"%@.", path_, name,
               undescribed.empty() ? "" : "; its driver does not describe the controls " + undescribed);
@@ -408,7 +453,12 @@ bool V4l2Device::call(unsigned long request, std::string_view name, void* argume
 
 // What an error number means that usually says something else.
 std::string_view V4l2Device::hintFor(int number) const {
-  if (number != ENOSPC || !fixedText(capability_.bus_info).starts_with("usb-")) return {};
+  const bool isUsb = fixedText(capability_.bus_info).starts_with("usb-");
+  if (!isUsb && (number == EPIPE || number == ENOLINK)) {
+    return "the links and pads on the camera's path do not fit together; \"media\" of the camera in the binding sets "
+           "them.";
+  }
+  if (number != ENOSPC || !isUsb) return {};
   return "the USB bus has too little bandwidth left for this stream. Use a smaller size, a lower rate, a compressed "
          "format or another bus.";
 }

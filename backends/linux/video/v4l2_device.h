@@ -45,6 +45,9 @@ class V4l2Device final {
   // The same for the node that was found as `info`. Fails (kDeviceGone) if its path now belongs to another device.
   static std::shared_ptr<V4l2Device> open(std::shared_ptr<V4l2Api> kernel, const V4l2DeviceInfo& info,
                                           DiagnosticErrorPtr* error);
+  // Opens a sub-device of a media controller, which has controls and no buffers.
+  static std::shared_ptr<V4l2Device> openSubdevice(std::shared_ptr<V4l2Api> kernel, const std::string& path,
+                                                   DiagnosticErrorPtr* error);
   // Opens the device only for queries, without a list of its controls.
   static std::shared_ptr<V4l2Device> inspect(std::shared_ptr<V4l2Api> kernel, const std::string& path,
                                              DiagnosticErrorPtr* error);
@@ -59,13 +62,18 @@ class V4l2Device final {
   // The capabilities of this node, not of the whole device: V4L2_CAP_...
   std::uint32_t capabilities() const;
   VideoNodeKind kind() const;
+  // Of its buffers and formats: V4L2_BUF_TYPE_...
+  std::uint32_t bufferType() const;
+  // True if a buffer has several planes, each in memory of its own.
+  bool isMultiplanar() const { return bufferType() == V4L2_BUF_TYPE_VIDEO_CAPTURE_MPLANE; }
 
   // Locks the device for this descriptor, among all processes that use this lock; fails (kBusy) while another one holds
   // it.
   bool lockExclusive(DiagnosticErrorPtr* error);
 
-  // The formats in the driver's order, with their known sizes and intervals.
-  std::vector<VideoFormat> formats() const;
+  // The formats in the driver's order, with their known sizes and intervals. With the code of a media bus format, only
+  // those that frames of it can have.
+  std::vector<VideoFormat> formats(std::uint32_t mediaBusCode = 0) const;
   // Sets the format and frame size. Fails (kNotSupported), without changing anything, if the driver has no such format
   // or would use another size.
   bool setFormat(const VideoMode& mode, DiagnosticErrorPtr* error);
@@ -78,7 +86,9 @@ class V4l2Device final {
   int setInterval(FrameInterval* interval);
 
   const std::vector<VideoControl>& controls() const { return controls_; }
-  // The control with that name; null and an error (kNotSupported) if there is none.
+  // The control with that name; null if there is none.
+  const VideoControl* findControl(std::string_view name) const;
+  // The same, with an error (kNotSupported) if there is none.
   const VideoControl* control(std::string_view name, DiagnosticErrorPtr* error) const;
   const VideoControl* controlOfId(std::uint32_t id) const;
   // The present description of a control: some ranges change with the format. Nothing and an error if there is none.
@@ -100,6 +110,8 @@ class V4l2Device final {
 
  private:
   V4l2Device(std::shared_ptr<V4l2Api> kernel, std::string path, int descriptor);
+  static std::shared_ptr<V4l2Device> made(std::shared_ptr<V4l2Api> kernel, const std::string& path, int descriptor,
+                                          DiagnosticErrorPtr* error);
   static std::shared_ptr<V4l2Device> opened(std::shared_ptr<V4l2Api> kernel, const std::string& path, int descriptor,
                                             DiagnosticErrorPtr* error);
   std::string_view hintFor(int number) const;

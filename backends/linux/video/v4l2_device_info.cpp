@@ -137,7 +137,7 @@ std::optional<VideoNodeDetails> detailsOf(const std::shared_ptr<V4l2Api>& kernel
 bool matches(const V4l2DeviceInfo& node, const VideoNodeMatch& match) {
   return node.problem == nullptr && fits(match.driver, node.driver) && fits(match.card, node.card) &&
          fits(match.busInfo, node.busInfo) && fits(match.usbInterface, node.usbInterface) &&
-         fits(match.path, node.device);
+         fits(match.path, node.device) && fits(match.name, node.systemName);
 }
 
 std::optional<V4l2DeviceInfo> findVideoNode(const std::vector<V4l2DeviceInfo>& nodes, VideoNodeKind kind,
@@ -188,6 +188,7 @@ std::string textOf(const VideoNodeMatch& match) {
   add("bus", match.busInfo);
   if (match.usbInterface) add("USB interface", std::to_string(*match.usbInterface));
   add("path", match.path);
+  add("name", match.name);
   return text.empty() ? "any" : text;
 }
 

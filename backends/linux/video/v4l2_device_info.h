@@ -46,7 +46,7 @@ struct VideoControl {
 enum class VideoNodeKind {
   kCamera,    // captures video to buffers that can be mapped
   kMetadata,  // captures metadata to buffers that can be mapped
-  kOther      // not supported: outputs, radios, and cameras with only read() or several planes
+  kOther      // not supported: outputs, radios, and cameras with only read()
 };
 
 // Tells a node from one that replaced it: the kernel's number of its entry in sysfs, and when the entry was made.

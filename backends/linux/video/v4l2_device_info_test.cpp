@@ -78,8 +78,9 @@ TEST(VideoNodesTest, ANodeTellsWhatItIsOrWhyItCannotBeOpened) {
   FakeNode closed = fakeCamera("fake:0");
   closed.openProblem = EACCES;
   const std::string path = kernel->add(4, closed);
+  kernel->add(5, fakeMultiplanarCamera("fake:0"));
   const std::vector<V4l2DeviceInfo> nodes = videoNodes(kernel, kernel->roots());
-  ASSERT_EQ(nodes.size(), 5U);
+  ASSERT_EQ(nodes.size(), 6U);
   EXPECT_EQ(nodes[0].kind, VideoNodeKind::kCamera);
   EXPECT_EQ(nodes[0].capabilities, std::uint32_t{V4L2_CAP_VIDEO_CAPTURE | V4L2_CAP_STREAMING});
   EXPECT_EQ(nodes[0].systemName, "fake camera node");
@@ -89,6 +90,8 @@ TEST(VideoNodesTest, ANodeTellsWhatItIsOrWhyItCannotBeOpened) {
   ASSERT_NE(nodes[4].problem, nullptr);
   EXPECT_EQ(textOf(nodes[4]), path + " (open on " + path + " failed: Permission denied (EACCES))");
   EXPECT_FALSE(detailsOf(kernel, nodes[4], nullptr));
+  EXPECT_EQ(nodes[5].kind, VideoNodeKind::kCamera);
+  EXPECT_EQ(detailsOf(kernel, nodes[5], nullptr)->formats.at(0).fourcc, "NM12");
   EXPECT_TRUE(kernel->isIdle());
 }
 
