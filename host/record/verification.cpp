@@ -203,6 +203,7 @@ class Verifier {
     results.name = record.name;
     results.experimentName = record.experimentName;
     results.measuredResults = record.measuredResults;
+    results.limits = record.limits;
     results.error = record.error;
     results.skip = record.skip;
     results.verdict = record.verdict;
