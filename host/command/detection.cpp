@@ -1,6 +1,7 @@
 #include "host/command/detection.h"
 
 #include "contract/message_format.h"
+#include "host/model/limit_check.h"
 #include "host/report/text_report.h"
 #include "host/text/table.h"
 
@@ -25,26 +26,38 @@ const JudgedResult* resultNamed(const DiagnosticRecord& record, const std::strin
   return found == record.measuredResults.end() ? nullptr : &*found;
 }
 
-// Why a result that differs from that of the healthy phone does not fail.
-std::string whyItPasses(const JudgedResult& before, const JudgedResult& after) {
-  if (after.verdict == ResultVerdict::kNone) return "it has no limit";
-  const std::string limit = limitText(after.result.limit());
-  if (limitText(before.result.limit()) != limit) return "its limit changes with it (" + limit + ")";
-  return "it is within its limit (" + limit + ")";
+// Why a result that differs from that of the healthy phone does not fail. `checks` compare it with the user's limits.
+std::string whyItPasses(const JudgedResult& before, const JudgedResult& after, const std::vector<LimitCheck>& checks) {
+  std::vector<std::string> reasons;
+  if (after.verdict != ResultVerdict::kNone) {
+    const std::string limit = limitText(after.result.limit());
+    const bool isSame = limitText(before.result.limit()) == limit;
+    reasons.push_back((isSame ? "it is within its limit (" : "its limit changes with it (") + limit + ")");
+  }
+  for (const LimitCheck& check : checks) {
+    reasons.push_back((check.passed ? "it is within the limit " : "this limit only warns: ") + labelOf(check.limit));
+  }
+  if (reasons.empty()) return "it has no limit";
+  std::string text = reasons.front();
+  for (std::size_t i = 1; i < reasons.size(); ++i) text += ", and " + reasons[i];
+  return text;
 }
 
 void addResults(std::vector<std::string>& changes, const DiagnosticRecord& healthy, const DiagnosticRecord& record) {
-  for (const JudgedResult& one : record.measuredResults) {
+  const std::vector<LimitCheck> checks = limitChecksOf(record);
+  for (std::size_t i = 0; i < record.measuredResults.size(); ++i) {
+    const JudgedResult& one = record.measuredResults[i];
+    const std::vector<LimitCheck> own = checksOfResult(checks, i);
     const std::string& name = one.result.name();
     const JudgedResult* const before = resultNamed(healthy, name);
     if (before == nullptr) {
-      changes.push_back(name + " is new, and " + whyItPasses(one, one));
+      changes.push_back(name + " is new, and " + whyItPasses(one, one, own));
       continue;
     }
     const std::string now = valueText(one.result.measurement());
     const std::string then = valueText(before->result.measurement());
     if (now == then) continue;
-    changes.push_back(formatMessage("%@ is %@ instead of %@: %@", name, now, then, whyItPasses(*before, one)));
+    changes.push_back(formatMessage("%@ is %@ instead of %@: %@", name, now, then, whyItPasses(*before, one, own)));
   }
   for (const JudgedResult& one : healthy.measuredResults) {
     if (resultNamed(record, one.result.name()) == nullptr) {
@@ -96,38 +109,54 @@ void addLog(std::vector<std::string>& changes, const DiagnosticRecord& healthy, 
   }
 }
 
-std::string detectionText(const Detection& detection, std::string_view ifNothingIsFound) {
-  if (detection.found == 0) return std::string(ifNothingIsFound);
+std::string detectionText(PhoneKind kind, const Detection& detection) {
+  if (kind != PhoneKind::kFaulty) return detection.found == 0 ? "passed" : "FALSE ALARM";
+  if (detection.found == 0) return "not detected";
   if (detection.isComplete()) return "detected";
   return formatMessage("in %@ of %@ seeds", detection.found, detection.seeds);
 }
 
-std::string byDefaultText(const PhoneDetection& one) {
-  if (one.kind() == PhoneKind::kFaulty) return detectionText(one.byDefault, "not detected");
-  return one.byDefault.found == 0 ? "passed" : "FALSE ALARM";
-}
-
-// Limits that are stricter may detect a change that passes otherwise.
 std::string strictText(const PhoneDetection& one) {
-  if (!one.byStrict) return "not installed";
-  switch (one.kind()) {
-    case PhoneKind::kFaulty: return detectionText(*one.byStrict, "not detected");
-    case PhoneKind::kChanged: return detectionText(*one.byStrict, "passed");
-    case PhoneKind::kHealthy: break;
-  }
-  return one.byStrict->found == 0 ? "passed" : "FALSE ALARM";
+  return one.byStrict ? detectionText(one.kind, *one.byStrict) : "not installed";
 }
 
-void printReasons(std::ostream& out, const PhoneDetection& one) {
+std::string_view expectationText(const PhoneDetection& one) {
+  if (one.kind != PhoneKind::kFaulty) return "passed";
+  return one.isExpected ? "detected" : "not detected";
+}
+
+void printReasons(std::ostream& out, const std::string& heading, const std::vector<std::string>& reasons) {
+  printWrapped(out, heading, "    ", "      ");
+  for (const std::string& reason : reasons) printWrapped(out, reason, "    - ", "      ");
+}
+
+void printPhone(std::ostream& out, const PhoneDetection& one) {
   out << '\n';
-  printWrapped(out, one.phone + " (by strict: " + strictText(one) + ")", "  ", "    ");
+  const bool isAsExpected = one.kind == PhoneKind::kFaulty && !one.isExpected && one.byDefault.found == 0;
+  printWrapped(out, one.phone + (isAsExpected ? " (by default as its file expects)" : ""), "  ", "    ");
   if (!one.title.empty()) printWrapped(out, one.title, "    ", "    ");
-  for (const std::string& reason : one.reasons) printWrapped(out, reason, "    - ", "      ");
+  const std::string byDefault = detectionText(one.kind, one.byDefault);
+  const bool isSame = one.byStrict && strictText(one) == byDefault && one.byStrict->reasons == one.byDefault.reasons;
+  printReasons(out, (isSame ? "By default and by strict: " : "By default: ") + byDefault, one.byDefault.reasons);
+  if (one.byStrict && !isSame) printReasons(out, "By strict: " + strictText(one), one.byStrict->reasons);
 }
 
-bool isBlindSpot(const PhoneDetection& one) { return one.kind() == PhoneKind::kFaulty && !one.byDefault.isComplete(); }
+bool isIncomplete(const Detection& detection) { return !detection.isComplete(); }
 
-bool isPassedChange(const PhoneDetection& one) { return one.kind() == PhoneKind::kChanged && one.byDefault.found == 0; }
+bool hasFound(const Detection& detection) { return detection.found > 0; }
+
+// True if the predicate holds for a profile.
+bool holdsForAny(const PhoneDetection& one, bool (*predicate)(const Detection&)) {
+  return predicate(one.byDefault) || (one.byStrict && predicate(*one.byStrict));
+}
+
+bool isBlindSpot(const PhoneDetection& one) { return one.kind == PhoneKind::kFaulty && holdsForAny(one, isIncomplete); }
+
+bool isFalseAlarm(const PhoneDetection& one) { return one.kind != PhoneKind::kFaulty && holdsForAny(one, hasFound); }
+
+bool isPassedChange(const PhoneDetection& one) {
+  return one.kind == PhoneKind::kChanged && !holdsForAny(one, hasFound);
+}
 
 void printThose(std::ostream& out, const std::vector<PhoneDetection>& phones, bool (*isMeant)(const PhoneDetection&),
                 std::string_view heading) {
@@ -135,20 +164,18 @@ void printThose(std::ostream& out, const std::vector<PhoneDetection>& phones, bo
     if (!isMeant(one)) continue;
     out << heading;
     heading = "";
-    printReasons(out, one);
+    printPhone(out, one);
   }
 }
 
-void count(ProfileTotals& totals, PhoneKind kind, const Detection& detection, bool mayDetectChanges) {
-  switch (kind) {
-    case PhoneKind::kFaulty: ++(detection.isComplete() ? totals.detected : totals.blindSpots); return;
-    case PhoneKind::kChanged:
-      if (detection.found == 0) ++totals.changesPassed;
-      if (mayDetectChanges) return;
-      break;
-    case PhoneKind::kHealthy: break;
+void count(ProfileTotals& totals, PhoneKind kind, const Detection& detection) {
+  if (kind == PhoneKind::kFaulty) {
+    ++(detection.isComplete() ? totals.detected : totals.blindSpots);
+  } else if (detection.found > 0) {
+    ++totals.falseAlarms;
+  } else if (kind == PhoneKind::kChanged) {
+    ++totals.changesPassed;
   }
-  if (detection.found > 0) ++totals.falseAlarms;
 }
 
 std::string countsText(std::string_view by, const DetectionTotals& all, const ProfileTotals& totals) {
@@ -160,7 +187,18 @@ std::string countsText(std::string_view by, const DetectionTotals& all, const Pr
   return text + "\n";
 }
 
-Json detectionJson(const Detection& detection) { return {{"seeds", detection.seeds}, {"detected", detection.found}}; }
+Json detectionJson(const Detection& detection) {
+  return {{"seeds", detection.seeds}, {"detected", detection.found}, {"reasons", detection.reasons}};
+}
+
+std::string_view nameOf(PhoneKind kind) {
+  switch (kind) {
+    case PhoneKind::kHealthy: return "healthy";
+    case PhoneKind::kFaulty: return "faulty";
+    case PhoneKind::kChanged: break;
+  }
+  return "changed";
+}
 
 Json totalsOfProfileJson(const ProfileTotals& totals) {
   return {{"detected", totals.detected},
@@ -174,15 +212,15 @@ Json totalsOfProfileJson(const ProfileTotals& totals) {
 DetectionTotals totalsOf(const std::vector<PhoneDetection>& phones) {
   DetectionTotals totals;
   for (const PhoneDetection& one : phones) {
-    switch (one.kind()) {
+    switch (one.kind) {
       case PhoneKind::kFaulty: ++totals.faulty; break;
       case PhoneKind::kChanged: ++totals.changed; break;
       case PhoneKind::kHealthy: ++totals.healthy; break;
     }
-    count(totals.byDefault, one.kind(), one.byDefault, false);
+    count(totals.byDefault, one.kind, one.byDefault);
     if (!one.byStrict) continue;
     if (!totals.byStrict) totals.byStrict.emplace();
-    count(*totals.byStrict, one.kind(), *one.byStrict, true);
+    count(*totals.byStrict, one.kind, *one.byStrict);
   }
   return totals;
 }
@@ -203,17 +241,36 @@ std::vector<std::string> undetectedChanges(const DiagnosticRecord& healthy, cons
   return changes;
 }
 
+std::string alarmText(const DiagnosticRecord& record) {
+  if (record.verdict == Verdict::kError) {
+    return record.name + " ends in an error: " + record.error->localizedDescription();
+  }
+  std::vector<std::string> failed;
+  for (const JudgedResult& one : record.measuredResults) {
+    if (one.verdict == ResultVerdict::kFail) failed.push_back(one.result.name());
+  }
+  for (const LimitCheck& check : limitChecksOf(record)) {
+    if (!check.passed && check.counts())
+      failed.push_back(check.result.name() + " by the limit " + labelOf(check.limit));
+  }
+  std::string text = record.name + " fails: ";
+  for (std::size_t i = 0; i < failed.size() && i < kMaxReasons; ++i) text += (i == 0 ? "" : ", ") + failed[i];
+  if (failed.size() > kMaxReasons) text += formatMessage(" and %@ more", failed.size() - kMaxReasons);
+  return text;
+}
+
 void printDetections(std::ostream& out, const std::vector<PhoneDetection>& phones) {
   using Align = Table::Align;
   Table table({Align::kLeft, Align::kLeft, Align::kLeft, Align::kLeft});
   table.addHeader({"Phone", "Expected", "By default", "By strict"});
   for (const PhoneDetection& one : phones) {
-    const std::string_view expected = one.kind() == PhoneKind::kFaulty ? "detected" : "passed";
-    table.addRow({printable(one.phone), std::string(expected), byDefaultText(one), strictText(one)});
+    table.addRow({printable(one.phone), std::string(expectationText(one)), detectionText(one.kind, one.byDefault),
+                  strictText(one)});
   }
   table.print(out, "");
-  printThose(out, phones, isBlindSpot, "\nNot detected by default, and why:\n");
-  printThose(out, phones, isPassedChange, "\nPassed by default as the phone expects, and what differs:\n");
+  printThose(out, phones, isBlindSpot, "\nNot detected, and why:\n");
+  printThose(out, phones, isFalseAlarm, "\nFalse alarms:\n");
+  printThose(out, phones, isPassedChange, "\nPassed as the phone expects, and what differs:\n");
 }
 
 void printTotals(std::ostream& out, const DetectionTotals& totals) {
@@ -226,11 +283,10 @@ Json detectionsJson(const std::vector<PhoneDetection>& phones) {
   for (const PhoneDetection& one : phones) {
     json.push_back({{"phone", one.phone},
                     {"title", one.title},
-                    {"healthy", one.healthy},
+                    {"kind", nameOf(one.kind)},
                     {"expectsDetection", one.isExpected},
                     {"default", detectionJson(one.byDefault)},
-                    {"strict", one.byStrict ? detectionJson(*one.byStrict) : Json()},
-                    {"reasons", one.reasons}});
+                    {"strict", one.byStrict ? detectionJson(*one.byStrict) : Json()}});
   }
   return json;
 }

@@ -63,63 +63,109 @@ TEST(UndetectedChanges, NameThreeAndCountTheRest) {
   EXPECT_EQ(changes.back(), "D: and 2 more");
 }
 
+TEST(UndetectedChanges, NameTheLimitsOfTheUserToo) {
+  const DiagnosticRecord healthy = runWith(90, 80, 1);
+  UserLimit limit = parseUserLimit("Count > 60");
+  limit.source = "profile p.json";
+  const UserLimit warning = [] {
+    UserLimit one = parseUserLimit("Offset == 1");
+    one.severity = LimitSeverity::kWarn;
+    return one;
+  }();
+  const DiagnosticRecord judged = judgedWith(runWith(85, 80, 2), {limit, warning});
+  EXPECT_EQ(judged.verdict, Verdict::kPass);
+  EXPECT_THAT(
+      undetectedChanges(healthy, judged),
+      ElementsAre("D: Count is 85 frames instead of 90 frames: it is within its limit (Enough: >= 80), and it is "
+                  "within the limit " +
+                      labelOf(limit),
+                  "D: Offset is 2 events instead of 1 events: this limit only warns: " + labelOf(warning)));
+}
+
+TEST(AlarmText, SaysWhyARunDidNotPass) {
+  EXPECT_EQ(alarmText(recordOf("D", Verdict::kFail)), "D fails: Count");
+  EXPECT_EQ(alarmText(recordOf("D", Verdict::kError)), "D ends in an error: it failed");
+  const UserLimit limit = parseUserLimit("Count > 95");
+  EXPECT_EQ(alarmText(judgedWith(recordOf("D", Verdict::kPass), {limit})),
+            "D fails: Count by the limit " + labelOf(limit));
+}
+
 std::vector<PhoneDetection> phones() {
-  return {{"found", "", false, true, {3, 3}, Detection{3, 3}, {}},
-          {"changed", "Its title.", false, false, {3, 0}, Detection{3, 3}, {"D: a reason"}},
-          {"sometimes", "", false, true, {3, 1}, Detection{3, 1}, {"D: seeds"}},
-          {"healthy", "", true, false, {3, 0}, Detection{3, 1}, {}}};
+  return {{"found", "", PhoneKind::kFaulty, true, {3, 3}, Detection{3, 3}},
+          {"blind", "Its title.", PhoneKind::kFaulty, false, {3, 0, {"D: a reason"}}, Detection{3, 3}},
+          {"sometimes", "", PhoneKind::kFaulty, true, {3, 1, {"D: seeds"}}, Detection{3, 0, {"D: another"}}},
+          {"nowhere", "", PhoneKind::kFaulty, true, {3, 0, {"D: same"}}, Detection{3, 0, {"D: same"}}},
+          {"changed", "", PhoneKind::kChanged, false, {3, 0, {"D: differs"}}, Detection{3, 0, {"D: differs"}}},
+          {"alarmed", "", PhoneKind::kChanged, false, {3, 0, {"D: differs"}}, Detection{3, 3, {"D fails: Count"}}},
+          {"healthy", "", PhoneKind::kHealthy, false, {3, 0}, Detection{3, 1, {"D fails: Count"}}}};
 }
 
 TEST(Detections, AreCountedForBothProfiles) {
   const DetectionTotals totals = totalsOf(phones());
-  EXPECT_EQ(totals.faulty, 2U);
-  EXPECT_EQ(totals.changed, 1U);
+  EXPECT_EQ(totals.faulty, 4U);
+  EXPECT_EQ(totals.changed, 2U);
   EXPECT_EQ(totals.healthy, 1U);
   std::ostringstream out;
   printTotals(out, totals);
   EXPECT_EQ(out.str(),
-            "By default: 1 of 2 faults detected, 1 blind spot, 0 false alarms, 1 of 1 change passed\n"
-            "By strict: 1 of 2 faults detected, 1 blind spot, 1 false alarm, 0 of 1 change passed\n");
-  EXPECT_EQ(totalsJson(totals)["changed"], 1);
+            "By default: 1 of 4 faults detected, 3 blind spots, 0 false alarms, 2 of 2 changes passed\n"
+            "By strict: 2 of 4 faults detected, 2 blind spots, 2 false alarms, 1 of 2 changes passed\n");
+  EXPECT_EQ(totalsJson(totals)["changed"], 2);
   EXPECT_EQ(totalsJson(totals)["default"],
-            (nlohmann::ordered_json{{"detected", 1}, {"blindSpots", 1}, {"falseAlarms", 0}, {"changesPassed", 1}}));
+            (nlohmann::ordered_json{{"detected", 1}, {"blindSpots", 3}, {"falseAlarms", 0}, {"changesPassed", 2}}));
   EXPECT_EQ(totalsJson(totals)["strict"],
-            (nlohmann::ordered_json{{"detected", 1}, {"blindSpots", 1}, {"falseAlarms", 1}, {"changesPassed", 0}}));
+            (nlohmann::ordered_json{{"detected", 2}, {"blindSpots", 2}, {"falseAlarms", 2}, {"changesPassed", 1}}));
 }
 
-TEST(Detections, CountAChangeThatDoesNotPassByDefaultAsAFalseAlarm) {
-  const std::vector<PhoneDetection> changed = {{"changed", "", false, false, {3, 1}, Detection{3, 3}, {}}};
-  const DetectionTotals totals = totalsOf(changed);
-  EXPECT_EQ(totals.byDefault.falseAlarms, 1U);
-  EXPECT_EQ(totals.byDefault.changesPassed, 0U);
-  EXPECT_EQ(totals.byStrict->falseAlarms, 0U);
-  std::ostringstream out;
-  printDetections(out, changed);
-  EXPECT_EQ(out.str(),
-            "Phone    Expected  By default   By strict\n"
-            "changed  passed    FALSE ALARM  detected\n");
-}
-
-TEST(Detections, ListBlindSpotsAndPassedChangesWithTheirReasons) {
+TEST(Detections, ListWhatIsNotAsItShouldBeWithTheReasonsOfEachProfile) {
   std::ostringstream out;
   printDetections(out, phones());
   EXPECT_EQ(out.str(),
-            "Phone      Expected  By default       By strict\n"
-            "found      detected  detected         detected\n"
-            "changed    passed    passed           detected\n"
-            "sometimes  detected  in 1 of 3 seeds  in 1 of 3 seeds\n"
-            "healthy    passed    passed           FALSE ALARM\n"
+            "Phone      Expected      By default       By strict\n"
+            "found      detected      detected         detected\n"
+            "blind      not detected  not detected     detected\n"
+            "sometimes  detected      in 1 of 3 seeds  not detected\n"
+            "nowhere    detected      not detected     not detected\n"
+            "changed    passed        passed           passed\n"
+            "alarmed    passed        passed           FALSE ALARM\n"
+            "healthy    passed        passed           FALSE ALARM\n"
             "\n"
-            "Not detected by default, and why:\n"
+            "Not detected, and why:\n"
             "\n"
-            "  sometimes (by strict: in 1 of 3 seeds)\n"
-            "    - D: seeds\n"
-            "\n"
-            "Passed by default as the phone expects, and what differs:\n"
-            "\n"
-            "  changed (by strict: detected)\n"
+            "  blind (by default as its file expects)\n"
             "    Its title.\n"
-            "    - D: a reason\n");
+            "    By default: not detected\n"
+            "    - D: a reason\n"
+            "    By strict: detected\n"
+            "\n"
+            "  sometimes\n"
+            "    By default: in 1 of 3 seeds\n"
+            "    - D: seeds\n"
+            "    By strict: not detected\n"
+            "    - D: another\n"
+            "\n"
+            "  nowhere\n"
+            "    By default and by strict: not detected\n"
+            "    - D: same\n"
+            "\n"
+            "False alarms:\n"
+            "\n"
+            "  alarmed\n"
+            "    By default: passed\n"
+            "    - D: differs\n"
+            "    By strict: FALSE ALARM\n"
+            "    - D fails: Count\n"
+            "\n"
+            "  healthy\n"
+            "    By default: passed\n"
+            "    By strict: FALSE ALARM\n"
+            "    - D fails: Count\n"
+            "\n"
+            "Passed as the phone expects, and what differs:\n"
+            "\n"
+            "  changed\n"
+            "    By default and by strict: passed\n"
+            "    - D: differs\n");
 }
 
 TEST(Detections, SayWhereTheProfileStrictIsNotInstalled) {
@@ -127,7 +173,7 @@ TEST(Detections, SayWhereTheProfileStrictIsNotInstalled) {
   for (PhoneDetection& one : all) one.byStrict.reset();
   std::ostringstream out;
   printDetections(out, all);
-  EXPECT_THAT(out.str(), testing::HasSubstr("found      detected  detected         not installed\n"));
+  EXPECT_THAT(out.str(), testing::HasSubstr("found      detected      detected         not installed\n"));
   EXPECT_TRUE(totalsJson(totalsOf(all))["strict"].is_null());
 }
 

@@ -147,17 +147,6 @@ ExitCode performNothing(const Options& options, const Installation& installation
   return events->exitCode();
 }
 
-// The first rule of the command line, or else of the phone, that fits the diagnostic.
-std::optional<Skip> skipOf(const std::string& diagnostic, const std::vector<SkipRule>& ofCommandLine,
-                           const std::vector<SkipRule>& ofPhone) {
-  for (const std::vector<SkipRule>* const rules : {&ofCommandLine, &ofPhone}) {
-    for (const SkipRule& rule : *rules) {
-      if (matchesName(rule.pattern, diagnostic)) return rule.skip;
-    }
-  }
-  return std::nullopt;
-}
-
 // A plug-in that could not be loaded may have what the pattern fits.
 void refuseUnusedSkips(const std::vector<SkipRule>& rules, const Selection& selection) {
   for (const SkipRule& rule : rules) {
@@ -212,7 +201,8 @@ ExitCode runCommand(const Options& given, const Installation& installation, Cons
   tellLimitsForOtherValues(selection.profiles, selection.diagnostics, console.err);
   std::vector<Job> jobs;
   for (ResolvedDiagnostic& one : selection.diagnostics) {
-    std::optional<Skip> skip = skipOf(one.described.diagnostic.name, options.choice.skips, phone.absent);
+    std::optional<Skip> skip = skipOf(one.described.diagnostic.name, options.choice.skips);
+    if (!skip) skip = skipOf(one.described.diagnostic.name, phone.absent);
     DiagnosticErrorPtr problem = skip ? nullptr : missingParameter(one, options, installation);
     jobs.push_back({std::move(one), nullptr, options.seed, std::move(skip), std::move(problem)});
   }

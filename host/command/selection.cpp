@@ -218,6 +218,12 @@ std::string missingParameterOf(const ResolvedDiagnostic& one, const Options& opt
   return problem + "; --profile " + name + " replaces the default profile, and --parameters " + name + " adds to it";
 }
 
+std::optional<Skip> skipOf(const std::string& name, const std::vector<SkipRule>& rules) {
+  const auto fitting = std::find_if(rules.begin(), rules.end(),
+                                    [&name](const SkipRule& rule) { return matchesName(rule.pattern, name); });
+  return fitting == rules.end() ? std::nullopt : std::optional(fitting->skip);
+}
+
 std::vector<std::string> wantedScenarios(const std::vector<std::string>& names, const Installation& installation) {
   std::vector<std::string> all = installation.scenarioNames();
   if (names.empty()) return all;

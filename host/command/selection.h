@@ -3,9 +3,11 @@
 
 #include "host/cli/command_line.h"
 #include "host/cli/installation.h"
+#include "host/device/skip.h"
 #include "host/run/plugin_scan.h"
 
 #include <filesystem>
+#include <optional>
 #include <ostream>
 #include <string>
 #include <vector>
@@ -55,6 +57,9 @@ void tellLimitsForOtherValues(const std::vector<Profile>& profiles, const std::v
 
 // Like missingParameterOf() of its parameters; a profile that took the place of the default one may be the reason.
 std::string missingParameterOf(const ResolvedDiagnostic& one, const Options& options, const Installation& installation);
+
+// What the first rule that fits the diagnostic or experiment says; nothing if none fits.
+std::optional<Skip> skipOf(const std::string& name, const std::vector<SkipRule>& rules);
 
 // The installed scenarios and those of the user that the names and patterns fit, each once, and files; all without
 // names. Throws a CommandError (kUsage) for a name that fits none.

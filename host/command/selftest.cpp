@@ -184,6 +184,8 @@ void printSelftest(std::ostream& out, const SelftestOutcome& outcome) {
   out << formatMessage("\nPhones: %@ with a fault, %@%@ healthy; runs: %@, seeds of each: %@\n", totals.faulty, changed,
                        totals.healthy, rows.size(), outcome.seeds);
   printTotals(out, totals);
+  for (const UnusedLimit& one : outcome.unusedLimits)
+    printWrapped(out, "By " + one.profile + ": " + one.problem, "", "  ");
   if (differing == 0) {
     out << "Every run ended as its phone expects.\n";
   } else {
@@ -218,6 +220,10 @@ Json selftestDocument(const SelftestOutcome& outcome) {
   }
   Json refused = Json::array();
   for (const RefusedPhone& one : outcome.refused) refused.push_back({{"phone", one.name}, {"reason", one.reason}});
+  Json unusedLimits = Json::array();
+  for (const UnusedLimit& one : outcome.unusedLimits) {
+    unusedLimits.push_back({{"profile", one.profile}, {"problem", one.problem}});
+  }
   return {{"schema", 1},
           {"seeds", outcome.seeds},
           {"allAsExpected", allPassed(verdicts)},
@@ -226,6 +232,7 @@ Json selftestDocument(const SelftestOutcome& outcome) {
           {"totals", totalsJson(totalsOf(outcome.phones))},
           {"phones", detectionsJson(outcome.phones)},
           {"refused", std::move(refused)},
+          {"unusedLimits", std::move(unusedLimits)},
           {"rows", std::move(json)}};
 }
 

@@ -51,12 +51,19 @@ struct RefusedPhone {
   std::string reason;
 };
 
+// A limit of a profile that no result of any phone was compared with.
+struct UnusedLimit {
+  std::string profile;  // "default" or "strict"
+  std::string problem;  // a clause with the limit, its source and the reason
+};
+
 struct SelftestOutcome {
   std::vector<SelftestRow> rows;
   std::vector<PhoneDetection> phones;
   std::uint64_t seeds = 0;
   std::size_t wanted = 0;  // the number of phones to run, which is greater than that of `phones` after an interrupt
   std::vector<RefusedPhone> refused;  // not counted in `wanted`
+  std::vector<UnusedLimit> unusedLimits{};
 
   bool isComplete() const { return phones.size() == wanted; }
 };

@@ -11,7 +11,6 @@
 #include "host/text/table.h"
 
 #include <algorithm>
-#include <deque>
 #include <iterator>
 #include <optional>
 #include <ostream>
@@ -33,11 +32,37 @@ std::vector<Profile> profilesIn(const std::filesystem::path& file, const Install
   return profiles;
 }
 
-// The verdict on the run with the limits of the profiles in place of its own.
-Verdict verdictWith(DiagnosticRecord record, const std::vector<Profile>& profiles) {
-  if (record.verdict == Verdict::kError) return Verdict::kError;
-  record.limits = limitsFor(record.name, limitsOf(profiles));
-  return judgeRecord(record, true).verdict;
+// A profile with those that it is based on, and what it was used for.
+struct Judge {
+  std::string name;
+  std::vector<Profile> profiles;
+  std::vector<UserLimit> limits;
+  // Of each diagnostic that ended without an error, with any phone, the name and the results.
+  std::vector<DiagnosticRecord> measured{};
+};
+
+Judge judgeOf(std::string name, const std::filesystem::path& file, const Installation& installation) {
+  std::vector<Profile> profiles = profilesIn(file, installation);
+  std::vector<UserLimit> limits = limitsOf(profiles);
+  return {std::move(name), std::move(profiles), std::move(limits)};
+}
+
+// Adds the names of results that are new.
+void noteResults(std::vector<DiagnosticRecord>& measured, const DiagnosticRecord& record) {
+  if (record.error != nullptr || record.experimentOnly) return;
+  auto known = std::find_if(measured.begin(), measured.end(),
+                            [&record](const DiagnosticRecord& one) { return one.name == record.name; });
+  if (known == measured.end()) {
+    DiagnosticRecord first;
+    first.name = record.name;
+    known = measured.insert(measured.end(), std::move(first));
+  }
+  for (const JudgedResult& result : record.measuredResults) {
+    const bool isKnown =
+        std::any_of(known->measuredResults.begin(), known->measuredResults.end(),
+                    [&result](const JudgedResult& other) { return other.result.name() == result.result.name(); });
+    if (!isKnown) known->measuredResults.push_back(result);
+  }
 }
 
 bool haveSameValues(const ResolvedParameters& a, const ResolvedParameters& b) {
@@ -60,9 +85,9 @@ class Selftest {
         err_(console.err),
         status_(console.showsProgress ? &console.err : nullptr),
         signals_(signals) {
-    profiles_ = profilesIn(installation.defaultProfile(), installation);
+    default_ = judgeOf("default", installation.defaultProfile(), installation);
     const std::filesystem::path strict = installation.namedProfile(kStrict);
-    if (!strict.empty()) strict_ = profilesIn(strict, installation);
+    if (!strict.empty()) strict_ = judgeOf(kStrict, strict, installation);
   }
 
   // Ends at an interrupt; the phone that was running then is left out. A phone that is refused does not keep the others
@@ -77,6 +102,10 @@ class Selftest {
       if (!performPhone(phone, outcome)) break;
     }
     status_.erase();
+    if (outcome.isComplete()) {
+      addUnusedLimits(default_, outcome.unusedLimits);
+      if (strict_) addUnusedLimits(*strict_, outcome.unusedLimits);
+    }
     return outcome;
   }
 
@@ -104,7 +133,7 @@ class Selftest {
       const std::filesystem::path file = installation_.scenario(name);
       try {
         ScenarioSummary summary = summaryOfScenario(file, installation_.scenarioSource());
-        leaveOutInherited(summary.expected, file);
+        leaveOutInherited(summary, file);
         if (!summary.expected.empty()) phones.push_back({name, file, std::move(summary)});
       } catch (const InputError& problem) {
         err_ << "quazor: REFUSED phone " << printable(name) << ": " << printable(problem.what()) << '\n';
@@ -115,10 +144,15 @@ class Selftest {
   }
 
   // Whoever bases a phone on another one need not load the diagnostics of that one: removes what is expected of
-  // diagnostics that are not loaded. Throws InputError if the file itself expects it, or if a plug-in that failed to
-  // load may have the diagnostic.
-  void leaveOutInherited(std::vector<ExpectedOutcome>& expected, const std::filesystem::path& file) const {
-    std::erase_if(expected, [&](const ExpectedOutcome& one) {
+  // diagnostics that are not loaded, or that the phone says it cannot run. Throws InputError if the file itself expects
+  // it, or if a plug-in that failed to load may have the diagnostic.
+  void leaveOutInherited(ScenarioSummary& summary, const std::filesystem::path& file) const {
+    std::erase_if(summary.expected, [&](const ExpectedOutcome& one) {
+      if (const std::optional<Skip> skip = skipOf(one.name, summary.absent)) {
+        failIfNamedIn(file, one,
+                      one.name + " is not run, because \"absent\" says: " + skip->reason + " Remove one of the two.");
+        return true;
+      }
       if (findLoaded(one) != nullptr) return false;
       const std::string problem = "no loaded plug-in has " + one.name;
       failIfNamedIn(file, one, problem + "; load it with --plugin, or remove this entry.");
@@ -135,34 +169,82 @@ class Selftest {
 
   bool isInterrupted() const { return signals_ != nullptr && signals_->requestsToEnd() > 0; }
 
+  // What the runs of one profile on a phone came to.
+  struct ProfileRuns {
+    Judge& judge;
+    Detection& detection;
+    std::vector<DiagnosticRecord> records{};  // with the first seed
+    std::vector<std::string> alarms{};        // of the last seed
+  };
+
+  // A phone whose own file says that it passes, and that declares no fault, is no fault.
+  static PhoneKind kindOf(const WantedPhone& wanted, bool isDefault) {
+    if (isDefault) return PhoneKind::kHealthy;
+    const std::vector<ExpectedOutcome>& expected = wanted.summary.expected;
+    const bool mustPass = std::all_of(expected.begin(), expected.end(),
+                                      [](const ExpectedOutcome& one) { return one.verdict == nameOf(Verdict::kPass); });
+    const bool saysSo = std::any_of(expected.begin(), expected.end(),
+                                    [&wanted](const ExpectedOutcome& one) { return isNamedIn(wanted.file, one); });
+    return mustPass && saysSo && !wanted.summary.hasFaults ? PhoneKind::kChanged : PhoneKind::kFaulty;
+  }
+
+  // The diagnostics that `run --all` runs on the phone besides those of which its file expects something.
+  std::vector<ExpectedOutcome> othersFor(const ScenarioSummary& summary) const {
+    std::vector<ExpectedOutcome> others;
+    for (const DescribedDiagnostic& one : scan_.catalogue) {
+      const std::string& name = one.diagnostic.name;
+      const bool isExpected = std::any_of(summary.expected.begin(), summary.expected.end(),
+                                          [&](const ExpectedOutcome& outcome) { return findLoaded(outcome) == &one; });
+      if (one.diagnostic.experimentOnly || isExpected || skipOf(name, summary.absent)) continue;
+      ExpectedOutcome other;
+      other.name = name;
+      if (hasItsParameters(other, default_) && (!strict_ || hasItsParameters(other, *strict_))) {
+        others.push_back(std::move(other));
+      }
+    }
+    return others;
+  }
+
+  bool hasItsParameters(const ExpectedOutcome& one, const Judge& judge) const {
+    const DescribedDiagnostic& described = find(one);
+    return missingParameterOf(described, parametersOf(described, one, judge.profiles)).empty();
+  }
+
   // Adds the rows of the phone and its detection. Returns false if it was interrupted; then it adds nothing.
   bool performPhone(const WantedPhone& wanted, SelftestOutcome& outcome) {
     const auto& [name, file, summary] = wanted;
-    PhoneDetection phone{name, summary.title, file == installation_.defaultScenario(), false, {}, {}, {}};
+    PhoneDetection phone{name, summary.title, kindOf(wanted, file == installation_.defaultScenario())};
     std::vector<SelftestRow> rows;
     for (const ExpectedOutcome& expected : summary.expected) {
       rows.push_back({name, expected, 0, 0, 0, {}, {}});
       if (expected.verdict != nameOf(Verdict::kPass)) phone.isExpected = true;
     }
-    if (strict_) phone.byStrict.emplace();
-    std::vector<DiagnosticRecord> passed;  // with the first seed
-    for (std::uint64_t seed = 0; seed < options_.seeds; ++seed) {
-      bool found = false;
-      bool foundByStrict = false;
-      for (SelftestRow& row : rows) {
-        DiagnosticRecord record = run(file, row.expected, seed, profiles_);
-        if (isInterrupted()) return false;
-        count(row, record);
-        if (record.verdict != Verdict::kPass) found = true;
-        if (strict_ && strictVerdict(file, row.expected, record) != Verdict::kPass) foundByStrict = true;
-        if (isInterrupted()) return false;
-        if (seed == 0) passed.push_back(std::move(record));
-      }
-      add(phone.byDefault, found);
-      if (phone.byStrict) add(*phone.byStrict, foundByStrict);
+    std::vector<ExpectedOutcome> wantedRuns = summary.expected;
+    if (phone.kind != PhoneKind::kChanged) {  // of the other diagnostics its file does not say that they pass
+      for (ExpectedOutcome& other : othersFor(summary)) wantedRuns.push_back(std::move(other));
     }
-    if (!phone.healthy && !phone.byDefault.isComplete()) {
-      phone.reasons = reasonsOf(rows, passed, phone.byDefault);
+    std::vector<ProfileRuns> profiles{{default_, phone.byDefault}};
+    if (strict_) profiles.push_back({*strict_, phone.byStrict.emplace()});
+    for (std::uint64_t seed = 0; seed < options_.seeds; ++seed) {
+      for (std::size_t i = 0; i < wantedRuns.size(); ++i) {
+        const ExpectedOutcome& expected = wantedRuns[i];
+        const bool isNamed = i < rows.size();
+        const DiagnosticRecord record = run(file, expected, seed, default_.profiles);
+        if (isInterrupted()) return false;
+        if (isNamed) count(rows[i], record);
+        for (ProfileRuns& one : profiles) {
+          DiagnosticRecord judged = recordBy(one.judge, file, expected, record);
+          const bool isAlarm = judged.verdict != Verdict::kPass && (isNamed || isNews(phone.kind, expected, one.judge));
+          if (isInterrupted()) return false;
+          if (isAlarm) one.alarms.push_back(alarmText(judged));
+          noteResults(one.judge.measured, judged);
+          if (seed == 0) one.records.push_back(std::move(judged));
+        }
+      }
+      for (ProfileRuns& one : profiles) addSeed(one, phone.kind);
+    }
+    for (ProfileRuns& one : profiles) {
+      if (needsReasons(phone.kind, one.detection)) one.detection.reasons = reasonsOf(wanted, wantedRuns, one);
       if (isInterrupted()) return false;
     }
     outcome.phones.push_back(std::move(phone));
@@ -170,46 +252,78 @@ class Selftest {
     return true;
   }
 
-  static void add(Detection& detection, bool found) {
+  static void addSeed(ProfileRuns& runs, PhoneKind kind) {
+    Detection& detection = runs.detection;
     ++detection.seeds;
-    if (found) ++detection.found;
+    if (!runs.alarms.empty()) ++detection.found;
+    if (kind != PhoneKind::kFaulty && detection.reasons.empty()) detection.reasons = runs.alarms;
+    runs.alarms.clear();
   }
 
-  // The verdict with the profile strict. A run whose parameters it does not change is only judged again.
-  Verdict strictVerdict(const std::filesystem::path& file, const ExpectedOutcome& expected,
-                        const DiagnosticRecord& record) {
-    if (expected.experimentOnly) return record.verdict;
-    if (haveSameValues(parametersOf(find(expected), expected, *strict_), record.parameters)) {
-      return verdictWith(record, *strict_);
+  static bool needsReasons(PhoneKind kind, const Detection& detection) {
+    if (kind == PhoneKind::kFaulty) return !detection.isComplete();
+    return kind == PhoneKind::kChanged && detection.found == 0;
+  }
+
+  // The run by the profile. One whose parameters the profile does not change is only judged again.
+  DiagnosticRecord recordBy(const Judge& judge, const std::filesystem::path& file, const ExpectedOutcome& expected,
+                            const DiagnosticRecord& record) {
+    if (expected.experimentOnly) return record;
+    if (haveSameValues(parametersOf(find(expected), expected, judge.profiles), record.parameters)) {
+      return judgedWith(record, judge.limits);
     }
-    return verdictWith(run(file, expected, record.seed, *strict_), *strict_);
+    return judgedWith(run(file, expected, record.seed, judge.profiles), judge.limits);
   }
 
-  // Why the runs of a phone with a fault passed.
-  std::vector<std::string> reasonsOf(const std::vector<SelftestRow>& rows, const std::vector<DiagnosticRecord>& records,
-                                     const Detection& detection) {
-    if (detection.found > 0) return {"whether it is detected depends on the order of simultaneous events"};
+  // A diagnostic that does not pass on the healthy phone either says nothing about another one.
+  bool isNews(PhoneKind kind, const ExpectedOutcome& expected, const Judge& judge) {
+    if (kind == PhoneKind::kHealthy) return true;
+    const std::optional<DiagnosticRecord> healthy = healthyRun(expected, judge);
+    return !healthy || healthy->verdict == Verdict::kPass;
+  }
+
+  // Why the runs on a phone that differs from the healthy one passed.
+  std::vector<std::string> reasonsOf(const WantedPhone& wanted, const std::vector<ExpectedOutcome>& wantedRuns,
+                                     const ProfileRuns& runs) {
+    if (runs.detection.found > 0) return {"whether it is detected depends on the order of simultaneous events"};
     std::vector<std::string> reasons;
-    for (std::size_t i = 0; i < rows.size(); ++i) {
-      const DiagnosticRecord* const healthy = healthyRun(rows[i].expected);
-      if (healthy == nullptr) return {"there is no healthy phone to compare it with"};
-      for (std::string& one : undetectedChanges(*healthy, records[i])) reasons.push_back(std::move(one));
+    for (std::size_t i = 0; i < wantedRuns.size(); ++i) {
+      const std::optional<DiagnosticRecord> healthy = healthyRun(wantedRuns[i], runs.judge);
+      if (!healthy) return {"there is no healthy phone to compare it with"};
+      if (runs.records[i].verdict != Verdict::kPass) {
+        reasons.push_back(wantedRuns[i].name + " does not pass on the healthy phone either");
+        continue;
+      }
+      for (std::string& one : undetectedChanges(*healthy, runs.records[i])) reasons.push_back(std::move(one));
+    }
+    for (const DescribedDiagnostic& one : scan_.catalogue) {
+      if (one.diagnostic.experimentOnly) continue;
+      const std::optional<Skip> skip = skipOf(one.diagnostic.name, wanted.summary.absent);
+      if (skip) reasons.push_back(one.diagnostic.name + " is skipped: " + skip->reason);
     }
     if (reasons.empty()) reasons.emplace_back("it changes nothing that is measured or logged");
     return reasons;
   }
 
-  // The same run, with the first seed, on the healthy phone; null if there is none. Each is run once.
-  const DiagnosticRecord* healthyRun(const ExpectedOutcome& expected) {
+  // The same run, with the first seed, on the healthy phone, by the profile; nothing if there is none. Each is run
+  // once.
+  std::optional<DiagnosticRecord> healthyRun(const ExpectedOutcome& expected, const Judge& judge) {
     const std::filesystem::path file = installation_.defaultScenario();
-    if (!std::filesystem::exists(file)) return nullptr;
-    for (const HealthyRun& one : healthyRuns_) {
-      if (one.name == expected.name &&
-          haveSameValues(one.record.parameters, parametersOf(find(expected), expected, profiles_)))
-        return &one.record;
+    if (!std::filesystem::exists(file)) return std::nullopt;
+    const ResolvedParameters parameters = parametersOf(find(expected), expected, judge.profiles);
+    auto known = std::find_if(healthyRuns_.begin(), healthyRuns_.end(), [&](const HealthyRun& one) {
+      return one.name == expected.name && haveSameValues(one.record.parameters, parameters);
+    });
+    if (known == healthyRuns_.end()) {
+      known = healthyRuns_.insert(healthyRuns_.end(), {expected.name, run(file, expected, 0, judge.profiles)});
     }
-    healthyRuns_.push_back({expected.name, run(file, expected, 0, profiles_)});
-    return &healthyRuns_.back().record;
+    return expected.experimentOnly ? known->record : judgedWith(known->record, judge.limits);
+  }
+
+  static void addUnusedLimits(const Judge& judge, std::vector<UnusedLimit>& unused) {
+    for (const UserLimit& limit : limitsWithoutResult(judge.limits, judge.measured)) {
+      unused.push_back({judge.name, errorOfLimitWithoutResult(limit, judge.measured)->localizedDescription()});
+    }
   }
 
   static void count(SelftestRow& row, const DiagnosticRecord& record) {
@@ -265,10 +379,10 @@ class Selftest {
   const IsolationOptions isolation_;
   std::ostream& err_;
   StatusLine status_;
-  std::vector<Profile> profiles_;  // the default one and what it is based on
-  std::optional<std::vector<Profile>> strict_;
+  Judge default_;
+  std::optional<Judge> strict_;
   WatchedSignals* const signals_;
-  std::deque<HealthyRun> healthyRuns_;  // a growing deque does not move them
+  std::vector<HealthyRun> healthyRuns_;
 };
 
 }  // namespace

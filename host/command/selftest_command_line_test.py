@@ -17,41 +17,89 @@ STOP_REFUSED = "camera_sync/stop_refused"
 REFUSED = "camera_sync/start_refused_on_first"
 EXAMPLE = PLUGINS / "event_count.so"
 BACK = "CameraSyncDiagnostic.Back"
+FOUND_BY_OTHERS = ("projector_fault/fault_events_before_streaming", "projector_fault/channel_in_another_group",
+                   "projector_fault/channel_without_count", "projector_fault/first_port_type_unreadable",
+                   "report_channels/channel_in_extended_subgroup")
+FOUND_BY_OTHERS_WITH_STRICT = ("projector_fault/frames_dropped", "projector_fault/start_delayed")
 
 
 class SelftestTest(CommandLineTest):
-    def test_a_change_that_must_pass_has_its_reason_and_what_the_profile_strict_finds(self):
+    def test_a_fault_that_its_file_expects_to_pass_is_a_blind_spot_with_the_reasons_of_each_profile(self):
         result = quazor("selftest", "healthy", DROPPED, REFUSED, "--seeds", "1")
         self.assertEqual(result.returncode, 0, result.stderr)
-        self.assertRegex(result.stdout, rf"\n{DROPPED} +passed +passed +detected\n")
+        self.assertRegex(result.stdout, rf"\n{DROPPED} +not detected +not detected +detected\n")
         self.assertRegex(result.stdout, rf"\n{REFUSED} +detected +detected +detected\n")
         self.assertRegex(result.stdout, r"\nhealthy +passed +passed +passed\n")
-        self.assertIn(f"\n  {DROPPED} (by strict: detected)\n", result.stdout)
-        self.assertRegex(" ".join(result.stdout.split()), r"BackTele\.Total is 87 frames instead of 90 frames: its "
-                         r"limit changes with it")
-        self.assertIn("\nPassed by default as the phone expects, and what differs:\n", result.stdout)
-        self.assertNotIn("Not detected by default", result.stdout)
-        self.assertIn("\nPhones: 1 with a fault, 1 with a change that must pass, 1 healthy; runs: ", result.stdout)
-        self.assertIn("By default: 1 of 1 fault detected, 0 blind spots, 0 false alarms, 1 of 1 change passed\n", result.stdout)
-        self.assertIn("By strict: 1 of 1 fault detected, 0 blind spots, 0 false alarms, 0 of 1 change passed\n", result.stdout)
+        self.assertIn(f"\nNot detected, and why:\n\n  {DROPPED} (by default as its file expects)\n", result.stdout)
+        self.assertRegex(" ".join(result.stdout.split()), r"By default: not detected .*BackTele\.Total is 87 frames "
+                         r"instead of 90 frames: its limit changes with it .* By strict: detected ")
+        self.assertIn("\nPhones: 2 with a fault, 1 healthy; runs: ", result.stdout)
+        self.assertIn("By default: 1 of 2 faults detected, 1 blind spot, 0 false alarms\n", result.stdout)
+        self.assertIn("By strict: 2 of 2 faults detected, 0 blind spots, 0 false alarms\n", result.stdout)
 
     def test_the_document_has_the_same(self):
         result = quazor("selftest", DROPPED, "--seeds", "1", "--format", "json")
         document = json.loads(result.stdout)
-        self.assertEqual(document["totals"]["default"], {"detected": 0, "blindSpots": 0, "falseAlarms": 0, "changesPassed": 1})
+        self.assertEqual(document["totals"]["default"], {"detected": 0, "blindSpots": 1, "falseAlarms": 0, "changesPassed": 0})
         self.assertEqual(document["totals"]["strict"],
-                         {"detected": 0, "blindSpots": 0, "falseAlarms": 0, "changesPassed": 0})
-        self.assertEqual((document["totals"]["faulty"], document["totals"]["changed"]), (0, 1))
+                         {"detected": 1, "blindSpots": 0, "falseAlarms": 0, "changesPassed": 0})
+        self.assertEqual((document["totals"]["faulty"], document["totals"]["changed"]), (1, 0))
         phone, = document["phones"]
-        self.assertEqual((phone["phone"], phone["expectsDetection"]), (DROPPED, False))
-        self.assertTrue(any("BackTele.Total" in one for one in phone["reasons"]), phone)
+        self.assertEqual((phone["phone"], phone["kind"], phone["expectsDetection"]), (DROPPED, "faulty", False))
+        self.assertTrue(any("BackTele.Total" in one for one in phone["default"]["reasons"]), phone)
+        self.assertEqual(phone["strict"]["reasons"], [])
         self.assertFalse(document["interrupted"])
+        self.assertEqual(document["unusedLimits"], [])
+
+    def test_what_run_all_finds_is_detected_whatever_the_phone_expects(self):
+        # Their files expect nothing of the diagnostics that notice these.
+        result = quazor("selftest", *FOUND_BY_OTHERS, *FOUND_BY_OTHERS_WITH_STRICT, "--seeds", "1", "--format", "json")
+        self.assertEqual(result.returncode, 0, result.stderr)
+        for one in json.loads(result.stdout)["phones"]:
+            with self.subTest(one["phone"]):
+                self.assertEqual(one["default"]["detected"], 1 if one["phone"] in FOUND_BY_OTHERS else 0, one)
+                self.assertEqual(one["strict"]["detected"], 1, one)
+                run = quazor("run", "--all", "--phone", one["phone"])
+                self.assertEqual(run.returncode == 0, one["default"]["detected"] == 0)
+
+    def test_what_the_phone_says_it_lacks_is_skipped(self):
+        result = quazor("selftest", "single_camera/one_camera", "--seeds", "1", "--format", "json")
+        self.assertEqual(result.returncode, 0, result.stderr)
+        document = json.loads(result.stdout)
+        phone, = document["phones"]
+        self.assertEqual((phone["kind"], phone["default"]["detected"]), ("changed", 0))
+        self.assertIn("TesselFaultDiagnostic is skipped: This phone has no depth camera.", phone["default"]["reasons"])
+        # An inherited expectation of such a diagnostic is left out, one of the file itself is a contradiction.
+        absent = {"TesselFault*": "It has no projector."}
+        inherits = self.write("inherits.json", json.dumps({"base": "healthy", "title": "Mine", "absent": absent}))
+        result = quazor("selftest", inherits, "--seeds", "1", "--format", "json")
+        self.assertEqual(result.returncode, 0, result.stdout + result.stderr)
+        self.assertNotIn("TesselFaultDiagnostic", [row["name"] for row in json.loads(result.stdout)["rows"]])
+        both = {"base": "healthy", "title": "Mine", "absent": absent, "expect": {"TesselFaultDiagnostic": {"verdict": "pass"}}}
+        self.assert_refused(quazor("selftest", self.write("both.json", json.dumps(both))), 66, "expect.TesselFaultDiagnostic: ",
+                            '"absent" says: It has no projector.')
+
+    def test_false_alarms_are_counted_by_both_profiles(self):
+        own = {"base": "healthy", "title": "Mine", "cameras": {"back-tele": {"droppedFrames": [3]}},
+               "expect": {BACK: {"verdict": "pass"}}}
+        phone = self.write("mine.json", json.dumps(own))
+        result = quazor("selftest", phone, "--seeds", "1")
+        self.assertEqual(result.returncode, 0, result.stderr)
+        self.assertRegex(result.stdout, r"mine\.json +passed +passed +FALSE ALARM\n")
+        self.assertIn("1 with a change that must pass", result.stdout)
+        self.assertIn("By default: 0 of 0 faults detected, 0 blind spots, 0 false alarms, 1 of 1 change passed\n", result.stdout)
+        self.assertIn("By strict: 0 of 0 faults detected, 0 blind spots, 1 false alarm, 0 of 1 change passed\n", result.stdout)
+        self.assertRegex(" ".join(result.stdout.split()), rf"False alarms: .* By strict: FALSE ALARM - {BACK} fails: BackTele\.Total")
+        own["faults"] = [{"operation": "CaptureStream.stop", "object": "back-tele", "action": "fail"}]
+        phone.write_text(json.dumps(own))
+        result = quazor("selftest", phone, "--seeds", "1", "--format", "json")
+        self.assertEqual(json.loads(result.stdout)["phones"][0]["kind"], "faulty", result.stderr)
 
     def test_the_limit_on_log_lines_holds_in_this_process_too(self):
         def reasons(*arguments):
             result = quazor("selftest", STOP_REFUSED, "--seeds", "1", "--format", "json", *arguments)
             self.assertEqual(result.returncode, 0, result.stderr)
-            return [one.rsplit(": ", 1)[-1] for one in json.loads(result.stdout)["phones"][0]["reasons"]]
+            return [one.rsplit(": ", 1)[-1] for one in json.loads(result.stdout)["phones"][0]["default"]["reasons"]]
 
         everything = reasons()
         self.assertEqual(len(everything), 2)
@@ -59,6 +107,37 @@ class SelftestTest(CommandLineTest):
         limited = [everything[0], "1 more log line was left out (--log-limit)"]
         self.assertEqual(reasons("--log-limit", "1"), limited)
         self.assertEqual(reasons("--log-limit", "1", "--in-process"), limited)
+
+
+class LimitsOfProfilesTest(CommandLineTest):
+    def selftest(self, limit, profile, phone):
+        entries = {"CameraSyncDiagnostic.*": {"limits": [{"limit": limit}]}}
+        folder = self.directory / "data/quazor/profiles"
+        folder.mkdir(parents=True, exist_ok=True)
+        (folder / f"{profile}.json").write_text(json.dumps({"schema": 1, "base": profile, "diagnostics": entries}))
+        env = {"XDG_DATA_HOME": str(self.directory / "data")}
+        result = quazor("selftest", phone, "--seeds", "1", "--format", "json", env=env)
+        self.assertEqual(result.returncode, 0, result.stdout + result.stderr)
+        return json.loads(result.stdout), quazor("run", "--all", "--phone", phone, env=env)
+
+    def test_those_of_an_own_default_profile_count_by_default(self):
+        document, run = self.selftest("*.Total == 90 frames", "default", DROPPED)
+        self.assertEqual(run.returncode, 1)
+        self.assertEqual(document["phones"][0]["default"]["detected"], 1)
+        self.assertEqual(document["totals"]["default"]["blindSpots"], 0)
+
+    def test_one_that_holds_is_told_as_a_reason(self):
+        document, run = self.selftest("*.Total > 80 frames", "default", DROPPED)
+        self.assertEqual(run.returncode, 0, run.stdout)
+        reasons = [one for one in document["phones"][0]["default"]["reasons"] if "BackTele.Total" in one]
+        self.assertRegex(reasons[0], r"it is within the limit .*> 80 frames .*profile default\.json")
+
+    def test_one_that_fits_no_result_is_told(self):
+        for profile in ("default", "strict"):
+            with self.subTest(profile):
+                document, _ = self.selftest("*.Totals == 90 frames", profile, "healthy")
+                unused, = (one for one in document["unusedLimits"] if one["profile"] == profile)
+                self.assertIn("was compared with nothing: no result has the name '*.Totals'", unused["problem"])
 
 
 class PhonesOfAUserTest(CommandLineTest):

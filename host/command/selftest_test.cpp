@@ -106,7 +106,8 @@ SelftestOutcome outcomeOf(std::vector<SelftestRow> rows) {
   outcome.seeds = 3;
   for (const SelftestRow& one : rows) {
     const bool healthy = one.scenario == "healthy";
-    outcome.phones.push_back({one.scenario, "", healthy, !healthy, {3, 3 - one.passes}, {}, {}});
+    const PhoneKind kind = healthy ? PhoneKind::kHealthy : PhoneKind::kFaulty;
+    outcome.phones.push_back({one.scenario, "", kind, !healthy, {3, 3 - one.passes}});
   }
   outcome.rows = std::move(rows);
   outcome.wanted = outcome.phones.size();
@@ -123,9 +124,10 @@ TEST(Selftest, PrintsTheMatrixAndWhatIsNotAsExpected) {
             "faulty   detected  detected         not installed\n"
             "missed   detected  in 2 of 3 seeds  not installed\n"
             "\n"
-            "Not detected by default, and why:\n"
+            "Not detected, and why:\n"
             "\n"
-            "  missed (by strict: not installed)\n"
+            "  missed\n"
+            "    By default: in 2 of 3 seeds\n"
             "\n"
             "Not as the phone expects:\n"
             "  Phone   Run   Expected  As expected  Outcome\n"
@@ -161,6 +163,16 @@ TEST(Selftest, SaysWhatWasRefused) {
   EXPECT_THAT(out.str(), testing::EndsWith("\nRefused: 1 of 2 phones\n"));
   const nlohmann::ordered_json due = {{"phone", "broken"}, {"reason", outcome.refused[0].reason}};
   EXPECT_EQ(selftestDocument(outcome)["refused"], nlohmann::ordered_json::array({due}));
+}
+
+TEST(Selftest, TellsLimitsThatFitNoResult) {
+  SelftestOutcome outcome = outcomeOf({row("faulty", errs(), 3, 0, {1})});
+  outcome.unusedLimits = {{"strict", "the limit was compared with nothing"}};
+  std::ostringstream out;
+  printSelftest(out, outcome);
+  EXPECT_THAT(out.str(), testing::HasSubstr("\nBy strict: the limit was compared with nothing\n"));
+  const nlohmann::ordered_json due = {{"profile", "strict"}, {"problem", "the limit was compared with nothing"}};
+  EXPECT_EQ(selftestDocument(outcome)["unusedLimits"], nlohmann::ordered_json::array({due}));
 }
 
 TEST(Selftest, IsADocumentToo) {

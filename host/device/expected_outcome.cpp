@@ -71,11 +71,24 @@ std::vector<ExpectedOutcome> readExpectedOutcomes(const JsonCursor& scenario) {
   return outcomes;
 }
 
-void failIfNamedIn(const std::filesystem::path& file, const ExpectedOutcome& expected, const std::string& sentence) {
-  const JsonDocument document = JsonDocument::read(file);  // without its base
+namespace {
+
+// The entry of the outcome in the document of a file without its base; nothing if it has none.
+std::optional<JsonCursor> entryOf(const JsonDocument& document, const ExpectedOutcome& expected) {
   const std::optional<JsonCursor> expect = JsonCursor(document).find("expect");
-  if (!expect) return;
-  if (const std::optional<JsonCursor> entry = expect->find(expected.key)) entry->fail(sentence);
+  return expect ? expect->find(expected.key) : std::nullopt;
+}
+
+}  // namespace
+
+bool isNamedIn(const std::filesystem::path& file, const ExpectedOutcome& expected) {
+  const JsonDocument document = JsonDocument::read(file);
+  return entryOf(document, expected).has_value();
+}
+
+void failIfNamedIn(const std::filesystem::path& file, const ExpectedOutcome& expected, const std::string& sentence) {
+  const JsonDocument document = JsonDocument::read(file);
+  if (const std::optional<JsonCursor> entry = entryOf(document, expected)) entry->fail(sentence);
 }
 
 }  // namespace quazor

@@ -36,8 +36,11 @@ struct ExpectedOutcome {
 // an outcome is malformed or contradictory. Thread: any.
 std::vector<ExpectedOutcome> readExpectedOutcomes(const JsonCursor& scenario);
 
-// Throws InputError, "FILE:LINE: expect.KEY: SENTENCE", if the file itself has the entry of this outcome. Returns if
-// the scenario only inherited it from its base. Thread: any.
+// True if the file itself has the entry of this outcome, false if the scenario only inherited it from its base.
+// Thread: any.
+bool isNamedIn(const std::filesystem::path& file, const ExpectedOutcome& expected);
+
+// Throws InputError, "FILE:LINE: expect.KEY: SENTENCE", if isNamedIn(). Thread: any.
 void failIfNamedIn(const std::filesystem::path& file, const ExpectedOutcome& expected, const std::string& sentence);
 
 }  // namespace quazor

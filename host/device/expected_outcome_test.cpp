@@ -59,7 +59,9 @@ TEST(ExpectedOutcomes, AreToldWithTheLineIfTheFileItselfNamesThem) {
   EXPECT_EQ(outcome.key, "A.B");
   EXPECT_EQ(thrownText<InputError>([&] { failIfNamedIn(file, outcome, "it is not loaded."); }),
             file.string() + ":2: expect.A.B: it is not loaded.");
+  EXPECT_TRUE(isNamedIn(file, outcome));
   outcome.key = "A";
+  EXPECT_FALSE(isNamedIn(file, outcome));
   EXPECT_NO_THROW(failIfNamedIn(file, outcome, "it is not loaded."));
   EXPECT_NO_THROW(failIfNamedIn(directory.write("q.json", R"({"base": "b.json"})"), outcome, "it is not loaded."));
 }

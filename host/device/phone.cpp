@@ -136,7 +136,7 @@ std::shared_ptr<LogBackend> systemLogOfThisMachine() {
 ScenarioSummary summaryOfScenario(const std::filesystem::path& file, const ScenarioSource& find) {
   const auto readIt = [&find](const std::filesystem::path& one) { return readScenarioFile(one, find); };
   ScenarioFile read = quazor::read(readIt, file);
-  return {read.scenario.title, std::move(read.expected), !read.scenario.faults.empty()};
+  return {read.scenario.title, std::move(read.expected), !read.scenario.faults.empty(), std::move(read.absent)};
 }
 
 }  // namespace quazor

@@ -72,6 +72,7 @@ struct ScenarioSummary {
   std::string title;
   std::vector<ExpectedOutcome> expected;
   bool hasFaults = false;
+  std::vector<SkipRule> absent{};
 };
 
 // Prefix of a phone's name that selects the machine quazor runs on; the name of the binding file follows.

@@ -130,4 +130,12 @@ RecordJudgement judgeRecord(const DiagnosticRecord& record, bool completed) {
   return {Verdict::kError, hostError(*judgement.problemCode, judgement.problem)};
 }
 
+DiagnosticRecord judgedWith(DiagnosticRecord record, const std::vector<UserLimit>& limits) {
+  record.limits = limitsFor(record.name, limits);
+  RecordJudgement judgement = judgeRecord(record, true);
+  record.verdict = judgement.verdict;
+  record.error = std::move(judgement.error);
+  return record;
+}
+
 }  // namespace quazor

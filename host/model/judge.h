@@ -2,6 +2,7 @@
 #pragma once
 
 #include "contract/results.h"
+#include "host/limits/user_limit.h"
 
 #include <optional>
 #include <string>
@@ -63,5 +64,8 @@ struct RecordJudgement {
 //
 // The verdict that the record holds does not count.
 RecordJudgement judgeRecord(const DiagnosticRecord& record, bool completed);
+
+// A run that has ended and was judged without the user's limits, judged with those of `limits` that are for it.
+DiagnosticRecord judgedWith(DiagnosticRecord record, const std::vector<UserLimit>& limits);
 
 }  // namespace quazor

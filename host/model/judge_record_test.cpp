@@ -39,6 +39,22 @@ TEST(JudgeRecord, TellsWhyItIsAnError) {
   EXPECT_EQ(codeOf({resultOf(90)}, false), static_cast<std::int64_t>(HostErrorCode::kConnectionLost));
 }
 
+TEST(JudgedWith, TakesTheLimitsThatAreForTheRun) {
+  DiagnosticRecord record = recordOf("D", Verdict::kPass);
+  record.measuredResults = judgeResults({resultWithMinimum(90, 80)});
+  const auto judgedBy = [&record](const char* limit) { return judgedWith(record, {parseUserLimit(limit)}); };
+  EXPECT_EQ(judgedBy("D:Count > 85").verdict, Verdict::kPass);
+  EXPECT_EQ(judgedBy("D:Count > 85").limits.size(), 1U);
+  EXPECT_EQ(judgedBy("D:Count > 95").verdict, Verdict::kFail);
+  EXPECT_EQ(judgedBy("E:Count > 95").verdict, Verdict::kPass);
+  EXPECT_TRUE(judgedBy("E:Count > 95").limits.empty());
+  const DiagnosticRecord error = judgedBy("D:Count > 95 seconds");
+  EXPECT_EQ(error.verdict, Verdict::kError);
+  EXPECT_EQ(error.error->code(), static_cast<std::int64_t>(HostErrorCode::kCannotBeJudged));
+  record.error = someError();
+  EXPECT_EQ(judgedBy("D:Count > 85").error, record.error);
+}
+
 TEST(JudgeRecord, AgreesWithTheOracleOnEveryCombination) {
   const std::vector<QZMeasuredResult> kinds = {resultOf(90), resultOf(89), resultOf(kNan),
                                                QZMeasuredResult("Info", resultOf(kNan).measurement())};
