@@ -288,6 +288,7 @@ Options optionsOf(const CLI::App& command, const RawOptions& raw) {
   options.choice = choiceOf(raw.choice);
   options.inProcess = raw.inProcess;
   options.seed = parseWhole("--seed", raw.seed, 0, UINT64_MAX);
+  if (const CLI::Option* const seed = command.get_option_no_throw("--seed")) options.hasSeed = seed->count() > 0;
   options.seeds = parseWhole("--seeds", raw.seeds, 1, 1'000'000);
   options.memory = memoryOf(raw.memory);
   for (const std::string& text : raw.settings) options.settings.push_back(parseOverride(text));
@@ -345,7 +346,8 @@ void declareRunningCommands(CLI::App& app, RawOptions& raw) {
   addNames(run, raw.names, "A diagnostic's");
   run.add_option("--only", raw.only,
                  "failed: rerun the diagnostics that did not pass in the last run, or in the record given with --of, "
-                 "with the same settings")
+                 "with the same settings, seed and tags. After --repeat or --attempts, the seed is that of the first "
+                 "entry that did not pass")
       ->type_name("failed")
       ->check(CLI::IsMember({"failed"}));
   run.add_option("--of", raw.of, "The record that --only refers to")->type_name("RECORD");
