@@ -319,10 +319,7 @@ void refuseUnknownCommand(const std::vector<std::string>& arguments) {
   const std::string& word = arguments.front();
   const std::vector<std::string> commands = commandNames();
   if (std::find(commands.begin(), commands.end(), word) != commands.end()) return;
-  std::string list;
-  for (const std::string& command : commands) list += (list.empty() ? "" : ", ") + command;
-  throw CommandError(ExitCode::kUsage,
-                     "unknown command '" + word + "'" + didYouMean(word, commands) + "; the commands are " + list);
+  throw CommandError(ExitCode::kUsage, "unknown command '" + word + "'" + didYouMeanOf(word, "the commands", commands));
 }
 
 void declareLookingCommands(CLI::App& app, RawOptions& raw) {
@@ -483,8 +480,9 @@ std::optional<Options> parseCommandLine(const std::vector<std::string>& given, s
     app.exit(answer, out, err);
     *code = ExitCode::kAllPassed;
   } catch (const CLI::ParseError& refusal) {
-    err << "quazor: " << printable(withoutMarks(refusal.what())) << "\nRun '" << helpCommandFor(given)
-        << "' for usage.\n";
+    const std::string unknown = unknownOptionIn(given);
+    err << "quazor: " << printable(unknown.empty() ? withoutMarks(refusal.what()) : unknown) << "\nRun '"
+        << helpCommandFor(given) << "' for usage.\n";
     *code = ExitCode::kUsage;
   } catch (const CommandError& refusal) {
     err << "quazor: " << printable(refusal.what()) << '\n';

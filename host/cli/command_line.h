@@ -71,7 +71,7 @@ struct Options {
   std::uint64_t seed = 0;
   bool hasSeed = false;                         // --seed was given
   std::map<std::string, std::uint64_t> seedOf;  // of a diagnostic whose seed is not that of the run
-  std::uint64_t seeds = 0;  // the number of seeds, starting at 0
+  std::uint64_t seeds = 0;                      // the number of seeds, starting at 0
   std::optional<LogLevel> logLevel;
   LogLimit logLimit;  // of each diagnostic
   Command command = Command::kList;

@@ -406,6 +406,10 @@ class OnlyFailedTest(RecordTest):
             with self.subTest(state):
                 result = self.run_fake(env={"XDG_STATE_HOME": state, "HOME": str(self.directory)})
                 self.assertEqual(result.returncode, 0, result.stderr)
+                warnings = [line for line in result.stderr.splitlines() if line.startswith("quazor: ")]
+                self.assertEqual(len(warnings), 1 if state == str(self.phone) else 0, warnings)
+                for warning in warnings:
+                    self.assertRegex(warning, "^quazor: 'run --only failed' will not know this run: .* cannot be written: ")
 
 
 class OutputsTest(RecordTest):

@@ -82,6 +82,9 @@ class RecordDefect : public CommandError {
 StoredRecord readRecord(const std::filesystem::path& file,
                         const std::function<void(std::uint64_t bytes)>& onProgress = nullptr);
 
+// True if the first line of the file is that of a record. False for a file that cannot be read.
+bool isRecord(const std::filesystem::path& file);
+
 // The run stored in a record. Incomplete diagnostics have the verdict kError.
 struct RecordedRun {
   RunStarted began;
