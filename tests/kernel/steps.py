@@ -49,7 +49,6 @@ STEPS = [
     Step("sensor_30s", "60 images a second for 30 s, without loss", sensors.sensor_30s, boot=2, limit=90, soak=True),
     Step("sensor_faults", "no sensor, two, silent, refusing, removed, pausing, with long reports",
          sensors.sensor_faults, boot=2),
-    Step("usb_sensor", "a USB sensor; one that stalls, is silent, pauses, is unplugged", usb.usb_sensor, boot=2),
     Step("media_controller", "frames of vimc come through links and pads of the binding", cameras.media_controller,
          boot=2, needs_vimc=True),
     Step("display_off", "no images while the display is dark or unplugged", sensors.display_off, boot=2),
@@ -67,4 +66,5 @@ STEPS = [
     Step("usb_unplugged_anytime", "a USB camera is unplugged at ten moments of a stream", usb.usb_unplugged_anytime,
          boot=3, limit=120, thorough=True),
     Step("usb_60s", "two USB cameras for 60 s, without loss", usb.usb_60s, boot=3, limit=120, soak=True, thorough=True),
+    Step("usb_sensor", "a USB sensor; one that stalls, is silent, pauses, is unplugged", usb.usb_sensor, boot=4),
 ]
