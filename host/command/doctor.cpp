@@ -135,7 +135,8 @@ class Doctor {
       const std::filesystem::path file = installation_.namedProfile(name);
       if (file != byDefault) files.push_back(file);
     }
-    const bool allLoaded = allFine_;  // one that was refused may have what an entry is for
+    // A plug-in that was refused or is hidden may have what an entry is for.
+    const bool allLoaded = allFine_ && installation_.hiddenPlugins().empty();
     for (const std::filesystem::path& file : files) {
       Profile read;
       check("profile", file.string(), [&] {
