@@ -54,7 +54,7 @@ void warnOfSuffixes(const Options& options, std::ostream& err) {
       const std::string file = output.file.string();
       err << "; for that, use ";
       if (*other == Format::kOcp) err << "--record " << printable(shellWord(file)) << " or ";
-      err << "--output " << printable(shellWord(name + ":" + file));
+      err << "--output " << printable(shellWord(formatMessage("%@:%@", name, file)));
     } else if (*other == Format::kText || *other == Format::kJson) {
       err << "; for that, use --format " << name;
     }
@@ -80,6 +80,7 @@ std::string unknownOptionIn(const std::vector<std::string>& arguments) {
   const std::vector<OptionSummary> options = optionsOfCommand(arguments.front());
   if (options.empty()) return {};
   std::vector<std::string> names;
+  names.reserve(options.size());
   for (const OptionSummary& one : options) names.push_back(one.name);
   for (std::size_t i = 1; i < arguments.size() && arguments[i] != "--"; ++i) {
     if (!arguments[i].starts_with("--")) continue;
