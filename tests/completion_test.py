@@ -57,6 +57,7 @@ class CompletionTest(unittest.TestCase):
         self.assertEqual(self.complete("run", "--only", ""), ["failed"])
         self.assertEqual(self.complete("run", "--log-limit", ""), ["none"])
         self.assertEqual(self.complete("run", "--log-lim"), ["--log-limit"])
+        self.assertEqual(self.complete("run", "--trace", "frames"), ["frames", "frames=all"])
         self.assertEqual(self.complete("run", "TesselFaultDiagnostic", "--set", ""), ["frameCount=", "timeout="])
         self.assertIn("camera_sync/frames_dropped", self.complete("run", "--phone", "camera_sync/fr"))
         self.assertEqual(self.complete("completion", "z"), ["zsh"])

@@ -31,6 +31,8 @@ class LinuxPhone final {
   std::vector<FaultStatus> faultStatus() const;
   // The number of frames that its cameras have passed to handlers.
   std::uint64_t framesDelivered() const { return capture_->framesDelivered(); }
+  // Tells the trace each frame that is delivered from now on. No device may have been made.
+  void traceFrames(FrameTrace& trace) { capture_->traceFrames(trace, platform_.clock); }
 
  private:
   const std::shared_ptr<LinuxCapture> capture_;

@@ -17,6 +17,8 @@
 
 namespace quazor {
 
+class FrameTrace;
+
 enum class PhoneTime {
   kVirtual,  // one thread; sleeping takes no real time, and a seed determines the order of events
   kReal      // real threads and the real clock; the seed has no effect
@@ -64,6 +66,8 @@ class SimulatedPhone final {
   std::vector<HeldBuffer> buffersHeld() const;
   // The number of frames passed to handlers, for all cameras, including those that are being handled.
   std::uint64_t framesDelivered() const { return hardware_->pool->taken(); }
+  // Tells the trace each frame that is delivered from now on; in virtual time it waits for room. No stream may run.
+  void traceFrames(FrameTrace& trace);
   // The number of releases of a pixel buffer without a matching reference.
   std::uint64_t strayReleases() const { return hardware_->pool->strayReleases(); }
   // Passes the next `count` frames of the camera's running stream to its handler immediately, on this thread. These

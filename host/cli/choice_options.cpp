@@ -76,6 +76,15 @@ void addLogLimit(CLI::App& command, std::string& text) {
       ->type_name("LINES[,MEBIBYTES]|none");
 }
 
+void addTrace(CLI::App& command, std::string& text) {
+  command
+      .add_option("--trace", text,
+                  "Which frames of the phone's streams the record has: none (off), or those of each diagnostic "
+                  "(frames). After N frames, default 100000, every second one, after N more every fourth and so on; "
+                  "with frames=all every one. Default frames")
+      ->type_name("off|frames[=N|=all]");
+}
+
 Choice choiceOf(const ChoiceTexts& texts) {
   Choice choice;
   choice.except = texts.except;

@@ -45,6 +45,7 @@ struct RawOptions {
   std::string what;
   std::string logLevel;
   std::string logLimit;
+  std::string trace = "frames";
   std::string format = "text";
   ChoiceTexts choice;
   bool all = false;
@@ -93,8 +94,8 @@ void removeMarks(RawOptions& raw) {
     std::for_each(texts->begin(), texts->end(), removeMark);
   }
   for (std::string* text :
-       {&raw.profile, &raw.phone, &raw.record, &raw.of, &raw.seed, &raw.seeds, &raw.memory, &raw.logLimit, &raw.grace,
-        &raw.choice.settle, &raw.choice.attempts, &raw.choice.repetitions}) {
+       {&raw.profile, &raw.phone, &raw.record, &raw.of, &raw.seed, &raw.seeds, &raw.memory, &raw.logLimit, &raw.trace,
+        &raw.grace, &raw.choice.settle, &raw.choice.attempts, &raw.choice.repetitions}) {
     removeMark(*text);
   }
 }
@@ -219,6 +220,7 @@ void addRunOptions(CLI::App& command, RawOptions& raw, const std::string& what) 
   command.add_flag("--realtime", raw.realTime, "Run the simulated phone in real time");
   command.add_option("--seed", raw.seed, "Seed for the order of simultaneous events; default 0")->type_name("N");
   addRecord(command, raw);
+  addTrace(command, raw.trace);
   addLogOptions(command, raw);
 }
 
@@ -264,9 +266,9 @@ std::vector<std::string> namesOfPhoneCommand(const CLI::App& command, const RawO
 }
 
 Options optionsOf(const CLI::App& command, const RawOptions& raw) {
-  for (const char* option :
-       {"--plugin", "--output", "--profile", "--parameters", "--phone", "--record", "--of", "RECORD", "--memory",
-        "--log-limit", "--grace", "--heartbeat", "--settle", "--except", "--skip", "--attempts", "--repeat"}) {
+  for (const char* option : {"--plugin", "--output", "--profile", "--parameters", "--phone", "--record", "--of",
+                             "RECORD", "--memory", "--log-limit", "--trace", "--grace", "--heartbeat", "--settle",
+                             "--except", "--skip", "--attempts", "--repeat"}) {
     refuseEmpty(command, option);
   }
   Options options;
@@ -298,6 +300,7 @@ Options optionsOf(const CLI::App& command, const RawOptions& raw) {
   if (command.get_option_no_throw("--heartbeat") != nullptr) options.heartbeat = parseHeartbeat(raw.heartbeat);
   options.logLevel = logLevelOf(raw.logLevel);
   options.logLimit = logLimitOf(raw.logLimit);
+  if (command.get_option_no_throw("--trace") != nullptr) options.trace = traceOf(raw.trace);
   options.systemLog = raw.systemLog;
   if (command.get_option_no_throw("--tag") != nullptr) options.tags = tagsOf(raw.tags);
   options.report = reportOf(raw, writesSeveralFormats(options.command));

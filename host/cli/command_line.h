@@ -9,6 +9,7 @@
 #include "host/plugin/profile.h"
 #include "host/report/run_report.h"
 #include "host/run/deadlines.h"
+#include "host/run/frame_teller.h"
 #include "host/run/log_limit.h"
 
 #include <chrono>
@@ -74,6 +75,7 @@ struct Options {
   std::uint64_t seeds = 0;                      // the number of seeds, starting at 0
   std::optional<LogLevel> logLevel;
   LogLimit logLimit;  // of each diagnostic
+  TraceSetting trace;
   Command command = Command::kList;
   bool all = false;
   bool onlyFailed = false;

@@ -108,6 +108,16 @@ TEST(ParseCommandLine, ReadsHowMuchMemoryThereIs) {
   EXPECT_EQ(parse({"run", "A", "--memory", "17592186044415"}).options->memory, UINT64_MAX - 1024 * 1024 + 1);
 }
 
+TEST(ParseCommandLine, ReadsWhichFramesAreRecorded) {
+  EXPECT_FALSE(parse({"run", "A", "--trace", "off"}).options->trace.isOn);
+  EXPECT_EQ(parse({"run", "A"}).options->trace.framesPerStep, 100'000U);
+  EXPECT_EQ(parse({"experiment", "E", "--trace", "frames"}).options->trace.framesPerStep, 100'000U);
+  EXPECT_EQ(parse({"run", "A", "--trace", "frames=7"}).options->trace.framesPerStep, 7U);
+  EXPECT_EQ(parse({"run", "A", "--trace", "frames=all"}).options->trace.framesPerStep, 0U);
+  EXPECT_TRUE(parse({"run", "A", "--trace", "frames=all"}).options->trace.isOn);
+  EXPECT_FALSE(parse({"analyze", "r"}).options->trace.isOn);
+}
+
 TEST(ParseCommandLine, ReadsHowMuchOfTheLogIsKept) {
   const auto limitOf = [](const std::string& text) {
     return parse({"run", "A", "--log-limit", text}).options->logLimit;
@@ -282,6 +292,12 @@ TEST(ParseCommandLine, RefusesWrongUsage) {
       {{"run", "A", "--log-limit", "5,1048577"}, "--log-limit: MEBIBYTES '1048577': expected"},
       {{"run", "A", "--log-limit", "5,6,7"}, "--log-limit: MEBIBYTES '6,7': expected"},
       {{"list", "--log-limit", "5"}, "--log-limit"},
+      {{"run", "A", "--trace", "queue"}, "--trace 'queue': expected off, frames, frames=N or frames=all"},
+      {{"run", "A", "--trace", "frames=0"}, "--trace: N '0': expected an integer from 1 to 1000000000"},
+      {{"run", "A", "--trace", "frames=-1"}, "--trace: N '-1': expected an integer"},
+      {{"run", "A", "--trace", "frames="}, "--trace: N '': expected an integer"},
+      {{"run", "A", "--trace", ""}, "--trace: the value is empty"},
+      {{"analyze", "r", "--trace=off"}, "--trace"},
       {{"run", "A", "--deadline", "soon"}, "--deadline 'soon': 'soon' is not a number"},
       {{"run", "A", "--deadline", "runn=5"}, "unknown stage 'runn'"},
       {{"run", "--only", "passed"}, "--only: passed not in {failed}"},

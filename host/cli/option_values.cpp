@@ -10,6 +10,7 @@
 #include <cstddef>
 #include <cstdlib>
 #include <sstream>
+#include <string_view>
 #include <system_error>
 
 namespace quazor {
@@ -23,6 +24,7 @@ constexpr std::uint64_t kDefaultMebibytes = 4096;
 // The largest limits on a diagnostic's log, other than none. A larger number is more likely a mistake.
 constexpr std::uint64_t kMaxLogLines = 1'000'000'000;
 constexpr std::uint64_t kMaxLogMebibytes = 1'048'576;
+constexpr std::uint64_t kMaxTracedFramesPerStep = 1'000'000'000;
 
 bool isControl(char unit) {
   const auto byte = static_cast<unsigned char>(unit);
@@ -81,6 +83,18 @@ LogLimit logLimitOf(const std::string& text) {
   if (comma == std::string::npos) return limit;
   limit.bytes = parseWhole("--log-limit: MEBIBYTES", text.substr(comma + 1), 1, kMaxLogMebibytes) * kMebibyte;
   return limit;
+}
+
+TraceSetting traceOf(const std::string& text) {
+  constexpr std::string_view kFrames = "frames=";
+  TraceSetting setting{text != "off", TraceSetting::kDefaultFrames};
+  if (text == "off" || text == "frames") return setting;
+  if (!text.starts_with(kFrames)) {
+    throw CommandError(ExitCode::kUsage, "--trace '" + text + "': expected off, frames, frames=N or frames=all");
+  }
+  const std::string number = text.substr(kFrames.size());
+  setting.framesPerStep = number == "all" ? 0 : parseWhole("--trace: N", number, 1, kMaxTracedFramesPerStep);
+  return setting;
 }
 
 std::optional<LogLevel> logLevelOf(const std::string& text) {

@@ -4,6 +4,7 @@
 #include "contract/log_channel.h"
 #include "contract/ordered_map.h"
 #include "host/limits/user_limit.h"
+#include "host/run/frame_teller.h"
 #include "host/run/log_limit.h"
 
 #include <cstdint>
@@ -25,6 +26,9 @@ std::optional<std::uint64_t> memoryOf(const std::string& text);
 
 // The limit of `--log-limit LINES[,MEBIBYTES]|none`; the default limit if the text is empty. Throws like parseWhole.
 LogLimit logLimitOf(const std::string& text);
+
+// The setting of `--trace off|frames[=N|=all]`. Throws like parseWhole.
+TraceSetting traceOf(const std::string& text);
 
 // The level of that name; nothing if there is none.
 std::optional<LogLevel> logLevelOf(const std::string& text);

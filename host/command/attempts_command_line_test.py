@@ -45,6 +45,8 @@ class AttemptsTest(RecordTest):
         self.assertEqual(self.entries("nep", "--attempts", "3", "--accept-flaky"), expected)
 
     def test_a_failure_is_final(self):
+        # An error that was accepted does not excuse a limit that fits no result.
+        self.document("ep", "--attempts", "2", "--accept-flaky", "--limit", "Nothing >= 1", names=BOTH[:1], code=2)
         self.assertEqual(self.entries("fp", "--attempts", "9", "--accept-flaky", code=1),
                          [("One", None, 1, "fail"), ("Two", None, 1, "pass")])
         self.assertEqual(self.entries("efpp", "--attempts", "9", "--accept-flaky", code=1),

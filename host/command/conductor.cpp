@@ -1,6 +1,7 @@
 #include "host/command/conductor.h"
 
 #include "host/model/trials.h"
+#include "host/run/traced_run.h"
 #include "host/text/timestamp.h"
 
 #include <chrono>
@@ -77,7 +78,7 @@ void Conductor::performHere(const Job& job) {
   if (job.result != nullptr) {
     analyzeResult(diagnostic, job.bound.parameters, *job.result, runOptions_.logLevel, events_);
   } else {
-    runDiagnostic(diagnostic, job.bound.parameters, runOptions_, events_);
+    runDiagnosticHere(diagnostic, job.bound.parameters, runOptions_, events_);
   }
 }
 

@@ -76,6 +76,9 @@ class LimitsTest(CommandLineTest):
         profile["diagnostics"]["Fake.*"] = {"limits": [{"limit": "Nowhere > 0"}]}
         path = self.write("profile.json", json.dumps(profile))
         self.assertEqual(self.run_limited("--parameters", path).returncode, 2)
+        profile["diagnostics"]["Fake.Two"] = profile["diagnostics"].pop("Fake.*")
+        path = self.write("profile.json", json.dumps(profile))
+        self.assertEqual(self.run_limited("--parameters", path).returncode, 0)
 
     def test_a_profile_is_refused_with_the_place_of_a_wrong_limit(self):
         for limit, problem in (({"limit": "A >"}, "a number or the name of a result is missing"),
@@ -105,6 +108,13 @@ class LimitsTest(CommandLineTest):
         for limits, code in (((), 1), (("--limit", f"{self.name} <= {self.value}"), 0)):
             done = quazor("analyze", record, "--plugin", WORKING, *limits)
             self.assertEqual(done.returncode, code, done.stdout + done.stderr)
+
+    def test_an_analysis_keeps_the_limits_on_other_results(self):
+        record = self.directory / "record.jsonl"
+        self.run_limited("--limit", f"{self.name} < {self.value}", "--record", record, "--replace")
+        path = self.profile({"Fake.*": {"limits": [{"limit": f"{self.name} >= 0", "severity": "warn"}]}})
+        done = quazor("analyze", record, "--plugin", WORKING, "--parameters", path)
+        self.assertEqual(done.returncode, 1, done.stdout + done.stderr)
 
     def test_an_entry_that_was_removed_is_missed(self):
         record = self.directory / "record.jsonl"

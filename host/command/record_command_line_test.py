@@ -15,7 +15,7 @@ class MakingTest(RecordTest):
     def test_a_record_holds_all_of_a_run(self):
         events = events_in(self.recorded("--set", "measured=90", "--seed", "9", names=["Fake.*"]))
         self.assertEqual([event["sequence"] for event in events], list(range(len(events))))
-        self.assertEqual(events[0]["record"], 2)
+        self.assertEqual(events[0]["record"], 3)
         self.assertEqual(events[0]["names"], ["Fake.One", "Fake.Two"])
         self.assertEqual((events[0]["seed"], events[0]["phone"], events[0]["plugins"]), (9, str(self.phone), [WORKING]))
         ended = [event["verdict"] for event in events if event["event"] == "diagnosticEnded"]
@@ -133,12 +133,12 @@ class VerifyTest(RecordTest):
 
     def test_a_record_of_a_later_version_is_refused_with_both_versions(self):
         def later(events):
-            events[0]["record"] = 3
+            events[0]["record"] = 4
             events[2]["event"] = "somethingNew"
 
         record = self.changed(later)
         wrote = json.loads(record.read_text().splitlines()[0])["program"]
-        sentence = (f"the record '{record}' says version 3, but this program reads versions 1 to 2; read it with the quazor "
+        sentence = (f"the record '{record}' says version 4, but this program reads versions 1 to 3; read it with the quazor "
                     f"that wrote it, {wrote}, or a later one")
         for arguments in (["verify", record], ["diff", self.record, record], ["diff", record, self.record],
                           ["analyze", record, "--plugin", WORKING], ["run", "--only", "failed", "--of", record]):

@@ -47,6 +47,17 @@ void tellLimitWithoutResult(const UserLimit& limit, EventPipeline& events) {
   events.endDiagnostic();
 }
 
+// Those of the record, but for those on whose results others are given.
+std::vector<UserLimit> limitsOfAnalysis(std::vector<UserLimit> recorded, const std::vector<UserLimit>& given) {
+  std::erase_if(recorded, [&given](const UserLimit& limit) {
+    return std::any_of(given.begin(), given.end(), [&limit](const UserLimit& other) {
+      return other.diagnostic == limit.diagnostic && other.result == limit.result;
+    });
+  });
+  recorded.insert(recorded.end(), given.begin(), given.end());
+  return recorded;
+}
+
 RunStarted beginningOf(const Options& options, const Installation& installation, const std::vector<Job>& jobs,
                        const std::vector<FailedPlugin>& failed) {
   RunStarted began{QUAZOR_VERSION, QUAZOR_CONTRACT_VERSION, dateNow(), {}, {}, options.seed, false, {}};
@@ -57,6 +68,7 @@ RunStarted beginningOf(const Options& options, const Installation& installation,
   if (options.choice.attempts > 1) began.attempts = options.choice.attempts;
   if (options.choice.repetitions > 1) began.repetitions = options.choice.repetitions;
   began.acceptFlaky = options.choice.acceptFlaky;
+  began.traced = options.trace.isOn;
   began.ofExperiments = options.command == Command::kExperiment;
   for (const FailedPlugin& plugin : failed) began.names.push_back(plugin.file.filename().string());
   for (const Job& job : jobs) began.names.push_back(job.bound.described.diagnostic.name);
@@ -211,6 +223,7 @@ ExitCode runCommand(const Options& given, const Installation& installation, Cons
   RunOptions runOptions;
   runOptions.logLevel = options.logLevel.value_or(LogLevel::kDefault);
   runOptions.logLimit = options.logLimit;
+  runOptions.trace = options.trace;
   RunStarted began = beginningOf(options, installation, jobs, selection.failed);
   began.phone = phone.name;
   began.limits = std::move(selection.limits);
@@ -288,7 +301,7 @@ ExitCode analyzeCommand(const Options& given, const Installation& installation, 
   began.phone = run.began.phone;
   began.seed = run.began.seed;
   began.acceptFlaky = run.began.acceptFlaky;
-  began.limits = selection.limits.empty() ? run.began.limits : selection.limits;
+  began.limits = limitsOfAnalysis(run.began.limits, selection.limits);
   return perform(options, installation, console, std::move(began), jobs, selection.failed, runOptions, nullptr,
                  signals);
 }

@@ -35,6 +35,9 @@ class SkipTest(RecordTest):
     def test_a_limit_that_only_a_skipped_one_could_meet_is_no_error(self):
         self.verdicts(*HOT, "--allow-skips", "--limit", "Fake.Two:Count >= 0")
 
+    def test_a_limit_that_fits_nothing_is_not_excused_by_a_skip(self):
+        self.verdicts(*HOT, "--allow-skips", "--limit", "Nothing >= 0", code=2)
+
     def test_a_phone_says_what_is_absent(self):
         self.phone = self.write("phone.json", json.dumps(SCENARIO | {"absent": {
             "*.Two": "This board has no second camera.", "Fake.One": {"kind": "not-allowed", "reason": "It is hot."},

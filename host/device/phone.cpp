@@ -35,6 +35,7 @@ class PhoneOfScenario final : public Phone {
   std::vector<DeclaredFault> faults() const override { return declared(phone_.faultStatus()); }
 
   std::uint64_t framesDelivered() const override { return phone_.framesDelivered(); }
+  void traceFrames(FrameTrace& trace) override { phone_.traceFrames(trace); }
 
  private:
   SimulatedPhone phone_;
@@ -47,6 +48,7 @@ class PhoneOfBinding final : public Phone {
   Platform platform() const override { return phone_.platform(); }
   std::vector<DeclaredFault> faults() const override { return declared(phone_.faultStatus()); }
   std::uint64_t framesDelivered() const override { return phone_.framesDelivered(); }
+  void traceFrames(FrameTrace& trace) override { phone_.traceFrames(trace); }
 
  private:
   LinuxPhone phone_;

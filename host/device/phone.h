@@ -19,6 +19,8 @@
 
 namespace quazor {
 
+class FrameTrace;
+
 // A fault that the scenario or binding declares, and the number of calls that it changed.
 struct DeclaredFault {
   nlohmann::ordered_json fault;
@@ -38,6 +40,9 @@ class Phone {
   virtual std::vector<DeclaredFault> faults() const = 0;
   // The number of frames that its cameras have delivered to handlers. Thread: any.
   virtual std::uint64_t framesDelivered() const = 0;
+  // From now on, each frame that its cameras deliver is told to streams of the trace. Called once, before any stream is
+  // started. The streams keep what they need.
+  virtual void traceFrames(FrameTrace& trace) = 0;
 };
 
 // Creates a new phone on every call, all in the same initial state.

@@ -4,6 +4,7 @@
 #include "contract/message_format.h"
 #include "host/error/host_error.h"
 #include "host/model/diagnostic_record.h"
+#include "host/model/trials.h"
 #include "host/plugin/diagnostic_registry.h"
 
 #include <algorithm>
@@ -130,6 +131,14 @@ std::vector<LimitCheck> limitChecksOf(const DiagnosticRecord& record) {
   return checks;
 }
 
+bool hasFailedResult(const DiagnosticRecord& record) {
+  const std::vector<LimitCheck> checks = limitChecksOf(record);
+  return std::any_of(record.measuredResults.begin(), record.measuredResults.end(),
+                     [](const JudgedResult& one) { return one.verdict == ResultVerdict::kFail; }) ||
+         std::any_of(checks.begin(), checks.end(),
+                     [](const LimitCheck& check) { return !check.passed && check.counts() && check.problem.empty(); });
+}
+
 std::vector<LimitCheck> checksOfResult(const std::vector<LimitCheck>& checks, std::size_t index) {
   std::vector<LimitCheck> wanted;
   std::copy_if(checks.begin(), checks.end(), std::back_inserter(wanted),
@@ -169,13 +178,23 @@ std::vector<UserLimit> limitsWithoutResult(const std::vector<UserLimit>& limits,
   std::vector<UserLimit> without;
   for (const UserLimit& limit : limits) {
     bool isMeant = false;
-    bool isDecided = false;  // it fits, or an error or a skip is the reason why it does not
-    for (const DiagnosticRecord& record : records) {
-      if (!appliesTo(limit, record.name) || isOfLimit(record)) continue;
+    bool wasSkipped = false;
+    bool wasMissed = false;  // by a diagnostic that has results
+    bool isDecided = false;  // it fits, or the run does not pass anyway
+    for (std::size_t i = 0; i < records.size(); ++i) {
+      const DiagnosticRecord& record = records[i];
+      if (!appliesTo(limit, record.name) || isOfLimit(record) || isSuperseded(records, i)) continue;
       isMeant = true;
-      isDecided = isDecided || record.error != nullptr || record.skip.has_value() || fitsAny(limit, record);
+      if (record.skip) {
+        wasSkipped = true;
+        isDecided = isDecided || record.skip->kind == SkipKind::kNotReached;  // after a failure or an error
+      } else {
+        wasMissed = true;
+        isDecided = isDecided || record.error != nullptr || fitsAny(limit, record);
+      }
     }
-    if (!isDecided && (isMeant || !limit.onlyIfSelected)) without.push_back(limit);
+    if (isDecided || (wasSkipped && !wasMissed)) continue;
+    if (isMeant || !limit.onlyIfSelected) without.push_back(limit);
   }
   return without;
 }

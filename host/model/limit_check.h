@@ -41,6 +41,9 @@ std::vector<UserLimit> limitsFitting(const std::string& result, const std::vecto
 // Compares every result of the record with every one of its limits that fits it by name, in the order of the results.
 std::vector<LimitCheck> limitChecksOf(const DiagnosticRecord& record);
 
+// True if a result is outside its own limits or outside one of the user's, whatever else went wrong.
+bool hasFailedResult(const DiagnosticRecord& record);
+
 // Those of `checks` that compare the result at `index`.
 std::vector<LimitCheck> checksOfResult(const std::vector<LimitCheck>& checks, std::size_t index);
 
@@ -48,9 +51,9 @@ std::vector<LimitCheck> checksOfResult(const std::vector<LimitCheck>& checks, st
 // are finite.
 std::optional<QZLimit> boundsOf(const LimitCheck& check);
 
-// The limits that fit no result in any of the records, although a diagnostic for which they are meant ended without an
-// error. A limit that is only meant for some diagnostics, none of which was selected, is not one of them if it comes
-// from a profile.
+// The limits that fit no result in any of the records. Not those that are meant for a diagnostic that ended in an
+// error, because the run is one then, nor those that are only meant for diagnostics that were skipped. A limit that is
+// only meant for some diagnostics, none of which was selected, is not one of them if it comes from a profile.
 std::vector<UserLimit> limitsWithoutResult(const std::vector<UserLimit>& limits,
                                            const std::vector<DiagnosticRecord>& records);
 

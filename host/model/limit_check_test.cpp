@@ -239,6 +239,23 @@ TEST(LimitWithoutResult, IsFoundAmongAllDiagnostics) {
   EXPECT_FALSE(without("Projector:X > 0", true, {passed, failed}));  // its diagnostic has no results
   EXPECT_FALSE(without("X > 0", false, {passed, failed}));
   EXPECT_TRUE(without("X > 0", false, {}));
+  DiagnosticRecord skipped;
+  skipped.name = "Projector";
+  skipped.skip = Skip{SkipKind::kNoSuchHardware, "r"};
+  EXPECT_FALSE(without("Projector:X > 0", false, {passed, skipped}));
+  EXPECT_FALSE(without("Projector:X > 0", true, {passed, skipped}));
+  EXPECT_TRUE(without("X > 0", false, {passed, skipped}));  // the other one ran and has no such result
+  skipped.skip->kind = SkipKind::kNotReached;
+  EXPECT_FALSE(without("X > 0", false, {passed, skipped}));  // something failed before
+  // An error that a later attempt replaced excuses nothing.
+  std::vector<DiagnosticRecord> attempts = {failed, passed};
+  attempts[1].name = "Projector";
+  attempts[0].verdict = Verdict::kError;
+  attempts[1].verdict = Verdict::kPass;
+  attempts[0].trial = {1, 2, 0, 0};
+  attempts[1].trial = {2, 2, 0, 0};
+  EXPECT_TRUE(without("X > 0", false, attempts));
+  EXPECT_FALSE(without("A > 0", false, attempts));
 }
 
 TEST(LimitWithoutResult, HasAnErrorThatNamesAPatternThatIsNear) {

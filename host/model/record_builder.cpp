@@ -87,6 +87,9 @@ void RecordBuilder::fold(const DiagnosticSkipped& event) { record_.skip = event.
 
 void RecordBuilder::fold(const Heartbeat& /*event*/) {}
 
+// There may be millions, and no report shows them.
+void RecordBuilder::fold(const FramesTraced& /*event*/) {}
+
 void RecordBuilder::fold(const DiagnosticCompleted& /*event*/) { completed_ = true; }
 
 void RecordBuilder::fold(const DiagnosticEnded& event) {

@@ -44,6 +44,7 @@ class RecordBuilder final : public RunEventSink {
   void fold(const FaultsCounted& event);
   void fold(const DiagnosticSkipped& event);
   void fold(const Heartbeat& event);
+  void fold(const FramesTraced& event);
   void fold(const DiagnosticCompleted& event);
   void fold(const DiagnosticEnded& event);
   void fold(const RunEnded& event);

@@ -2,6 +2,7 @@
 #pragma once
 
 #include "contract/results.h"
+#include "host/device/traced_frame.h"
 #include "host/model/diagnostic_record.h"
 
 #include <chrono>
@@ -33,6 +34,7 @@ struct RunStarted {
   std::uint64_t attempts = 0;
   std::uint64_t repetitions = 0;
   bool acceptFlaky = false;  // a pass after an error does not make the run an error
+  bool traced = false;       // the frames of the cameras are told, too
 };
 
 struct DiagnosticStarted {
@@ -102,6 +104,14 @@ struct Heartbeat {
   Date date{};
 };
 
+// Frames of one stream of the phone, in the order of their delivery. The phone tells them, not the plug-in.
+struct FramesTraced {
+  std::string stream;
+  std::uint64_t step = 1;           // 1: every frame; 2: every second one
+  std::vector<TracedFrame> frames;  // at most kMaxTracedFrames
+  std::uint64_t lost = 0;           // for which there was no room, and which were not told before
+};
+
 // The plug-in has finished; only the host sends further events of this diagnostic.
 struct DiagnosticCompleted {};
 
@@ -118,7 +128,7 @@ struct RunEnded {
 
 using RunEvent = std::variant<RunStarted, DiagnosticStarted, StageStarted, StageEnded, Logged, MeasurementsAdded,
                               AuxiliaryDataAdded, ResultsReported, Failed, FaultsCounted, DiagnosticSkipped, Heartbeat,
-                              DiagnosticCompleted, DiagnosticEnded, RunEnded>;
+                              FramesTraced, DiagnosticCompleted, DiagnosticEnded, RunEnded>;
 
 // Receives the events of a run, in order.
 // Thread: one at a time.

@@ -34,6 +34,9 @@ class RunLog final : public LogBackend {
 
   void write(LogLevel level, std::string_view subsystem, std::string_view category, std::string_view text) override;
 
+  // When the run's time began, by its clock.
+  std::chrono::nanoseconds begin() const { return begin_; }
+
   // Lines written after this are dropped.
   void close();
 

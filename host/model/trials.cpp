@@ -2,6 +2,7 @@
 
 #include "contract/message_format.h"
 #include "host/error/host_error.h"
+#include "host/model/limit_check.h"
 
 #include <algorithm>
 
@@ -40,12 +41,12 @@ bool mayTryAgain(const DiagnosticRecord& record) {
   if (record.verdict != Verdict::kError || record.error == nullptr) return false;
   const bool wasNotBegun = record.errorStage == Stage::kDescribe && record.stages.empty();
   return !wasNotBegun && !isHostError(*record.error, HostErrorCode::kInterrupted) &&
-         !isHostError(*record.error, HostErrorCode::kNotRecorded);
+         !isHostError(*record.error, HostErrorCode::kNotRecorded) && !hasFailedResult(record);
 }
 
 bool isSuperseded(const std::vector<DiagnosticRecord>& records, std::size_t index) {
   const DiagnosticRecord& record = records[index];
-  if (record.verdict != Verdict::kError || record.trial.attempt == 0) return false;
+  if (record.verdict != Verdict::kError || record.trial.attempt == 0 || hasFailedResult(record)) return false;
   for (std::size_t i = index + 1; i < records.size() && records[i].name == record.name; ++i) {
     const Trial& later = records[i].trial;
     if (later.repetition != record.trial.repetition || later.attempt <= record.trial.attempt) return false;

@@ -25,11 +25,11 @@ std::uint64_t seedOf(std::uint64_t seed, std::uint64_t repetition, std::uint64_t
 bool hasTrials(const std::vector<DiagnosticRecord>& records);
 
 // True if the diagnostic ended in an error that another attempt may not have: not if it was interrupted, if nothing
-// could be run at all, or if the record cannot be written.
+// could be run at all, if the record cannot be written, or if a result is outside its limits in spite of the error.
 bool mayTryAgain(const DiagnosticRecord& record);
 
 // True for an error that a later attempt of the same diagnostic, in the same repetition, replaced by a pass or a
-// failure. A failure is never superseded.
+// failure. A failure is never superseded, nor is an error with a result outside its limits.
 bool isSuperseded(const std::vector<DiagnosticRecord>& records, std::size_t index);
 
 // True for an attempt after which there was another.

@@ -1,6 +1,7 @@
 #include "host/model/trials.h"
 
 #include "host/error/host_error.h"
+#include "host/model/limit_check.h"
 #include "host/testing/test_records.h"
 
 #include <gtest/gtest.h>
@@ -54,6 +55,24 @@ TEST(MayTryAgain, OnlyAfterAnErrorThatMayGoAway) {
   EXPECT_FALSE(mayTryAgain(record));
   record.stages.push_back({Stage::kDescribe, {}, {}});
   EXPECT_TRUE(mayTryAgain(record));
+}
+
+// A failed teardown, for example, does not take back what was measured.
+TEST(Attempts, EndWithAFailedResultWhateverElseWentWrong) {
+  for (const bool ofUser : {false, true}) {
+    DiagnosticRecord record = entry(Verdict::kError, 1);
+    record.error = hostError(HostErrorCode::kCrashed, "m");
+    record.errorStage = Stage::kTeardown;
+    record.measuredResults = judgeResults({resultWithMinimum(ofUser ? 95 : 80, 90)});
+    if (ofUser) record.limits = {parseUserLimit("Count >= 99")};
+    EXPECT_TRUE(hasFailedResult(record));
+    EXPECT_FALSE(mayTryAgain(record));
+    const std::vector<DiagnosticRecord> records = {record, entry(Verdict::kPass, 2)};
+    EXPECT_FALSE(isSuperseded(records, 0));
+    EXPECT_EQ(runVerdictOf(records, true), Verdict::kError);
+    if (ofUser) record.limits.front().severity = LimitSeverity::kWarn;
+    EXPECT_EQ(mayTryAgain(record), ofUser) << "a warning is no failure";
+  }
 }
 
 TEST(IsSuperseded, OnlyByALaterAttemptOfTheSameRepetition) {

@@ -34,6 +34,14 @@ T get(const nlohmann::ordered_json& json, const char* key) {
 
 inline std::string textAt(const nlohmann::ordered_json& json, const char* key) { return textFrom(memberOf(json, key)); }
 
+// A count that is not written if it is 0.
+inline std::uint64_t countAt(const nlohmann::ordered_json& json, const char* key) {
+  if (!json.contains(key)) return 0;
+  const auto count = get<std::uint64_t>(json, key);
+  if (count == 0) throw InputError(std::string("\"") + key + "\" is 0");
+  return count;
+}
+
 inline const nlohmann::ordered_json& arrayAt(const nlohmann::ordered_json& json, const char* key) {
   const nlohmann::ordered_json& array = memberOf(json, key);
   if (!array.is_array()) throw InputError(std::string("\"") + key + "\" is not an array");

@@ -15,10 +15,13 @@
 #include <sys/stat.h>
 #include <unistd.h>
 
+#include <algorithm>
 #include <array>
 #include <cerrno>
 #include <cstring>
 #include <fstream>
+#include <functional>
+#include <map>
 #include <optional>
 #include <system_error>
 #include <utility>
@@ -103,13 +106,13 @@ void checkVersion(const std::filesystem::path& file, const Json& json) {
     throw InputError("the version of the record is " + version.dump() + ", but must be a number from " +
                      std::to_string(kFirstRecordFormat));
   }
-  if (version <= kRecordFormat) return;
+  if (version <= kRecordFormatWithFrames) return;
   const auto program = json.find("program");
   const std::string writer = program != json.end() && program->is_string() ? ", " + textFrom(*program) : "";
   throw CommandError(ExitCode::kCannotRead,
                      "the record '" + file.string() + "' says version " + version.dump() +
                          ", but this program reads versions " + std::to_string(kFirstRecordFormat) + " to " +
-                         std::to_string(kRecordFormat) + "; read it with the quazor that wrote it" + writer +
+                         std::to_string(kRecordFormatWithFrames) + "; read it with the quazor that wrote it" + writer +
                          ", or a later one");
 }
 
@@ -132,11 +135,51 @@ RunEvent eventInLine(const std::filesystem::path& file, std::uint64_t sequence, 
   }
 }
 
+// Checks frames against the lines before them.
+// Thread: one at a time.
+class FrameOrder {
+ public:
+  // Throws InputError.
+  void check(const RunEvent& event) {
+    if (const auto* const began = std::get_if<RunStarted>(&event)) isTraced_ = began->traced;
+    if (std::holds_alternative<DiagnosticStarted>(event)) delivered_.clear();
+    const auto* const traced = std::get_if<FramesTraced>(&event);
+    if (traced == nullptr) return;
+    if (!isTraced_) {
+      throw InputError("a record has the event 'frames' from version " + std::to_string(kRecordFormatWithFrames) +
+                       " on");
+    }
+    if (traced->frames.empty()) return;
+    const auto [last, isFirst] = delivered_.try_emplace(traced->stream, traced->frames.front().delivered);
+    if (traced->frames.front().delivered < last->second) {
+      throw InputError(
+          "the column \"delivered\", entry 1: the frame was delivered before the last one of the stream '" +
+          traced->stream + "' in an earlier line");
+    }
+    last->second = traced->frames.back().delivered;
+  }
+
+ private:
+  bool isTraced_ = false;
+  std::map<std::string, std::int64_t, std::less<>> delivered_;  // the last frame of each stream of the diagnostic
+};
+
+// Moves the frames to the stream of that name.
+void addFrames(std::vector<RecordedStream>& streams, FramesTraced&& event) {
+  auto stream = std::find_if(streams.begin(), streams.end(),
+                             [&event](const RecordedStream& one) { return one.name == event.stream; });
+  if (stream == streams.end()) stream = streams.insert(streams.end(), {event.stream, {}, 0});
+  stream->frames.insert(stream->frames.end(), event.frames.begin(), event.frames.end());
+  stream->lost += event.lost;
+  event.frames = {};
+}
+
 }  // namespace
 
 std::string recordLine(const RunEvent& event, std::uint64_t sequence) {
   Json line = {{"sequence", sequence}};
-  if (sequence == 0) line["record"] = kRecordFormat;
+  const auto* const began = std::get_if<RunStarted>(&event);
+  if (sequence == 0) line["record"] = began != nullptr && began->traced ? kRecordFormatWithFrames : kRecordFormat;
   line.update(eventJson(event));
   return line.dump(-1, ' ', false, Json::error_handler_t::replace) + "\n";
 }
@@ -251,6 +294,7 @@ StoredRecord readRecord(const std::filesystem::path& file, const std::function<v
                                                   (stream ? "it is a directory" : std::strerror(errno)));
   }
   StoredRecord stored;
+  FrameOrder frames;
   std::string line;
   std::uint64_t bytes = 0;
   while (readLine(stream, line)) {
@@ -261,6 +305,11 @@ StoredRecord readRecord(const std::filesystem::path& file, const std::function<v
       break;
     }
     stored.events.push_back(eventInLine(file, stored.events.size(), line));
+    try {
+      frames.check(stored.events.back());
+    } catch (const InputError& problem) {
+      refuseLine(file, stored.events.size(), problem.what());
+    }
   }
   if (stream.bad())
     throw CommandError(ExitCode::kCannotRead, "the record '" + file.string() + "' cannot be read to its end");
@@ -288,16 +337,22 @@ bool isRecord(const std::filesystem::path& file) {
 
 RecordedRun runIn(const std::filesystem::path& file) {
   refuseFolderAsRecord(file);
-  const StoredRecord stored = readRecord(file);
+  StoredRecord stored = readRecord(file);
   RecordedRun run;
   RecordBuilder builder;
-  for (const RunEvent& event : stored.events) {
+  std::vector<RecordedStream> streams;
+  const auto take = [&] {
+    run.records.push_back(builder.takeRecord());
+    run.streams.push_back(std::exchange(streams, {}));
+  };
+  for (RunEvent& event : stored.events) {
     builder.onEvent(event);
+    if (auto* const traced = std::get_if<FramesTraced>(&event)) addFrames(streams, std::move(*traced));
     if (const auto* const began = std::get_if<RunStarted>(&event)) run.began = *began;
     if (const auto* const ended = std::get_if<RunEnded>(&event)) run.ended = *ended;
-    if (std::holds_alternative<DiagnosticEnded>(event)) run.records.push_back(builder.takeRecord());
+    if (std::holds_alternative<DiagnosticEnded>(event)) take();
   }
-  if (builder.isOpen()) run.records.push_back(builder.takeRecord());
+  if (builder.isOpen()) take();
   return run;
 }
 

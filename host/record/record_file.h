@@ -14,8 +14,7 @@
 
 namespace quazor {
 
-// The version of the record format, and the first version that is still read.
-inline constexpr int kRecordFormat = 2;
+// The first version of the record format that is still read.
 inline constexpr int kFirstRecordFormat = 1;
 
 // Returns the record line of the event, including the line end. `sequence` is the number of events before it.
@@ -85,11 +84,19 @@ StoredRecord readRecord(const std::filesystem::path& file,
 // True if the first line of the file is that of a record. False for a file that cannot be read.
 bool isRecord(const std::filesystem::path& file);
 
+// The frames of a stream in one run of a diagnostic.
+struct RecordedStream {
+  std::string name;
+  std::vector<TracedFrame> frames;  // in the order of their delivery
+  std::uint64_t lost = 0;
+};
+
 // The run stored in a record. Incomplete diagnostics have the verdict kError.
 struct RecordedRun {
   RunStarted began;
   std::vector<DiagnosticRecord> records;
-  std::optional<RunEnded> ended;  // nothing: the run did not end
+  std::optional<RunEnded> ended;                       // nothing: the run did not end
+  std::vector<std::vector<RecordedStream>> streams{};  // those of each of the records
 };
 
 // The run in a record, which may be incomplete. Throws like readRecord() and, for a folder, refuseFolderAsRecord().

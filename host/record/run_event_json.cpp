@@ -2,6 +2,7 @@
 
 #include "base/text/input_error.h"
 #include "host/plugin/parameter_range.h"
+#include "host/record/frames_json.h"
 #include "host/record/json_members.h"
 #include "host/record/lossless_json.h"
 #include "host/text/timestamp.h"
@@ -165,13 +166,6 @@ void addCount(Json& json, const char* key, std::uint64_t count) {
   if (count > 0) json[key] = count;
 }
 
-std::uint64_t countAt(const Json& json, const char* key) {
-  if (!json.contains(key)) return 0;
-  const auto count = get<std::uint64_t>(json, key);
-  if (count == 0) throw InputError(std::string("\"") + key + "\" is 0");
-  return count;
-}
-
 Json jsonOf(const RunStarted& event) {
   Json json = {{"event", "runBegan"},
                {"program", losslessText(event.program)},
@@ -207,7 +201,8 @@ RunEvent readRunBegan(const Json& json) {
                     tagsAt(json, "tags"),
                     countAt(json, "attempts"),
                     countAt(json, "repetitions"),
-                    json.contains("acceptFlaky") && get<bool>(json, "acceptFlaky")};
+                    json.contains("acceptFlaky") && get<bool>(json, "acceptFlaky"),
+                    json.contains("record") && json["record"] == kRecordFormatWithFrames};
 }
 
 Json jsonOf(const DiagnosticStarted& event) {
@@ -361,6 +356,10 @@ RunEvent readHeartbeat(const Json& json) {
   return Heartbeat{stageAt(json, "stage"), nanosecondsAt(json, "nanoseconds"), dateAt(json, "date")};
 }
 
+Json jsonOf(const FramesTraced& event) { return framesJson(event); }
+
+RunEvent readFrames(const Json& json) { return framesFrom(json); }
+
 Json jsonOf(const DiagnosticCompleted& /*event*/) { return {{"event", "diagnosticCompleted"}}; }
 
 RunEvent readDiagnosticCompleted(const Json& /*json*/) { return DiagnosticCompleted{}; }
@@ -405,6 +404,7 @@ constexpr Reader kReaders[] = {{"runBegan", readRunBegan},
                                {"faultsCounted", readFaultsCounted},
                                {"skipped", readSkipped},
                                {"heartbeat", readHeartbeat},
+                               {"frames", readFrames},
                                {"diagnosticCompleted", readDiagnosticCompleted},
                                {"diagnosticEnded", readDiagnosticEnded},
                                {"runEnded", readRunEnded}};

@@ -9,6 +9,10 @@
 
 namespace quazor {
 
+// The version of the record format, and of one with the event `frames`.
+inline constexpr int kRecordFormat = 2;
+inline constexpr int kRecordFormatWithFrames = 3;
+
 nlohmann::ordered_json eventJson(const RunEvent& event);
 
 // Throws InputError if the JSON is not an event.

@@ -110,6 +110,9 @@ class Verifier {
       wasSkipped_ = false;
     }
     if (std::holds_alternative<DiagnosticSkipped>(event)) wasSkipped_ = true;
+    if (std::holds_alternative<FramesTraced>(event) && builder_.isOpen() && builder_.record().stages.empty()) {
+      add(builder_.record().name + ": frames are recorded before its first stage");
+    }
     if (std::holds_alternative<DiagnosticEnded>(event)) checkVerdict();
   }
 
@@ -200,6 +203,7 @@ class Verifier {
     results.name = record.name;
     results.experimentName = record.experimentName;
     results.measuredResults = record.measuredResults;
+    results.limits = record.limits;
     results.error = record.error;
     results.skip = record.skip;
     results.verdict = record.verdict;

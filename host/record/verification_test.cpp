@@ -1,6 +1,7 @@
 #include "host/record/verification.h"
 
 #include "host/error/host_error.h"
+#include "host/model/record_builder.h"
 #include "host/testing/test_events.h"
 
 #include <gmock/gmock.h>
@@ -54,6 +55,28 @@ QZMeasuredResult withMinimum(double minimum) {
 }
 
 TEST(ProblemsOf, FindsNoneInAWholeRun) { EXPECT_THAT(problemsOf(wholeRun()), IsEmpty()); }
+
+TEST(ProblemsOf, FindsFramesThatAreOutOfPlace) {
+  const FramesTraced frames{"front", 1, {{0, 1, 2, 3}}, 0};
+  for (std::size_t place = 0; place <= wholeRun().size(); ++place) {
+    Events events = wholeRun();
+    events.insert(events.begin() + static_cast<std::ptrdiff_t>(place), frames);
+    RecordBuilder builder;
+    for (std::size_t i = 0; i < place; ++i) builder.onEvent(events[i]);
+    if (place > wholeRun().size() - 1) {
+      EXPECT_THAT(problemsOf(events),
+                  ElementsAre("events follow the end of the run", "an event is recorded outside of any diagnostic"));
+    } else if (!builder.isOpen()) {
+      EXPECT_THAT(problemsOf(events), ElementsAre("an event is recorded outside of any diagnostic")) << place;
+    } else if (builder.record().stages.empty()) {
+      EXPECT_THAT(problemsOf(events),
+                  ElementsAre(builder.record().name + ": frames are recorded before its first stage"))
+          << place;
+    } else {
+      EXPECT_THAT(problemsOf(events), IsEmpty()) << place;
+    }
+  }
+}
 
 TEST(ProblemsOf, FindsNoneInAnyBeginningOfARun) {
   Events events = wholeRun();

@@ -81,21 +81,96 @@ void compare(const std::string& name, const Facts& before, const Facts& after, s
   }
 }
 
+std::string textOf(const TracedFrame& frame) {
+  const std::string returned = frame.returned ? formatMessage("returned at %@ ns", *frame.returned) : "not returned";
+  return formatMessage("number %@, captured at %@ ns, delivered at %@ ns, %@", frame.number, frame.captured,
+                       frame.delivered, returned);
+}
+
+const RecordedStream* streamNamed(const std::vector<RecordedStream>& streams, const std::string& name) {
+  const auto found =
+      std::find_if(streams.begin(), streams.end(), [&name](const RecordedStream& one) { return one.name == name; });
+  return found == streams.end() ? nullptr : &*found;
+}
+
+// The sentence about the first frame that differs; empty if none does. `subject` names diagnostic and stream.
+std::string frameDifference(const std::string& subject, const std::vector<TracedFrame>& before,
+                            const std::vector<TracedFrame>& after) {
+  const auto [one, other] = std::mismatch(before.begin(), before.end(), after.begin(), after.end());
+  if (one == before.end() && other == after.end()) return {};
+  const std::string begin = formatMessage("%@: frame %@, the first that differs,", subject, one - before.begin() + 1);
+  if (other == after.end()) return formatMessage("%@ is only in the first: %@", begin, textOf(*one));
+  if (one == before.end()) return formatMessage("%@ is only in the second: %@", begin, textOf(*other));
+  return formatMessage("%@ was %@ and is %@", begin, textOf(*one), textOf(*other));
+}
+
+void compareStreams(const std::string& name, const std::vector<RecordedStream>& before,
+                    const std::vector<RecordedStream>& after, std::vector<std::string>& differences) {
+  const auto subjectOf = [&name](const RecordedStream& stream) {
+    return formatMessage("%@: stream %@", name, stream.name);
+  };
+  for (const RecordedStream& stream : before) {
+    const RecordedStream* const other = streamNamed(after, stream.name);
+    if (other == nullptr) {
+      differences.push_back(subjectOf(stream) + " is only in the first");
+      continue;
+    }
+    std::string difference = frameDifference(subjectOf(stream), stream.frames, other->frames);
+    if (!difference.empty()) differences.push_back(std::move(difference));
+    if (stream.lost != other->lost) {
+      differences.push_back(
+          formatMessage("%@: the number of lost frames was %@ and is %@", subjectOf(stream), stream.lost, other->lost));
+    }
+  }
+  for (const RecordedStream& stream : after) {
+    if (streamNamed(before, stream.name) == nullptr)
+      differences.push_back(subjectOf(stream) + " is only in the second");
+  }
+}
+
+// A run and what is compared of it.
+// Thread: one at a time.
+class ComparedRun {
+ public:
+  // Borrows the run.
+  explicit ComparedRun(const RecordedRun& run) : facts(factsOf(run)) {
+    if (!run.began.traced) return;
+    for (std::size_t i = 0; i < run.streams.size(); ++i) {
+      streams_.set(run.records[i].name + trialSuffix(run.records[i]), &run.streams[i]);
+    }
+  }
+
+  // The streams of the diagnostic; null if they were not recorded.
+  const std::vector<RecordedStream>* streamsOf(const std::string& name) const {
+    const auto* const found = streams_.find(name);
+    return found == nullptr ? nullptr : *found;
+  }
+
+  const OrderedMap<Facts> facts;
+
+ private:
+  OrderedMap<const std::vector<RecordedStream>*> streams_;
+};
+
 }  // namespace
 
 std::vector<std::string> differencesOf(const RecordedRun& before, const RecordedRun& after) {
   std::vector<std::string> differences;
-  const OrderedMap<Facts> first = factsOf(before);
-  const OrderedMap<Facts> second = factsOf(after);
-  for (const auto& [name, facts] : first) {
-    if (const Facts* const others = second.find(name)) {
-      compare(name, facts, *others, differences);
-    } else {
+  const ComparedRun first(before);
+  const ComparedRun second(after);
+  for (const auto& [name, facts] : first.facts) {
+    const Facts* const others = second.facts.find(name);
+    if (others == nullptr) {
       differences.push_back(name + " is only in the first");
+      continue;
     }
+    compare(name, facts, *others, differences);
+    const auto* const streams = first.streamsOf(name);
+    const auto* const otherStreams = second.streamsOf(name);
+    if (streams != nullptr && otherStreams != nullptr) compareStreams(name, *streams, *otherStreams, differences);
   }
-  for (const auto& [name, facts] : second) {
-    if (!first.contains(name)) differences.push_back(name + " is only in the second");
+  for (const auto& [name, facts] : second.facts) {
+    if (!first.facts.contains(name)) differences.push_back(name + " is only in the second");
   }
   return differences;
 }

@@ -9,7 +9,8 @@
 namespace quazor {
 
 // One sentence per difference, "NAME: ...", in the order of `before` first. Diagnostics in both records are compared by
-// verdict, parameters, error, results (by name, with value, unit, limit and verdict) and measurements.
+// verdict, parameters, error, results (by name, with value, unit, limit and verdict) and measurements. If both records
+// have frames, the first one of each stream that differs is told.
 std::vector<std::string> differencesOf(const RecordedRun& before, const RecordedRun& after);
 
 }  // namespace quazor

@@ -95,6 +95,42 @@ TEST(DifferencesOf, TellWhatWasAndWhatIs) {
   for (const Row& row : rows) EXPECT_EQ(differences(row.change), row.differences) << row.name;
 }
 
+RecordedRun tracedRun(std::vector<RecordedStream> streams) {
+  RecordedRun run = runWith({recordOf("A", Verdict::kPass)});
+  run.began.traced = true;
+  run.streams = {std::move(streams)};
+  return run;
+}
+
+TEST(DifferencesOf, TellTheFirstFrameOfEachStreamThatDiffers) {
+  const std::vector<TracedFrame> frames = {{0, 1, 2, 3}, {1, 11, 12, 13}, {2, 21, 22, std::nullopt}};
+  const std::vector<TracedFrame> changed = {{0, 1, 2, 3}, {2, -5, 12, 14}, {2, 21, 22, 23}};
+  const std::vector<TracedFrame> shorter = {{0, 1, 2, 3}, {1, 11, 12, 13}};
+  const RecordedRun run = tracedRun({{"back", frames, 0}, {"front", frames, 0}});
+  EXPECT_THAT(differencesOf(run, run), IsEmpty());
+  EXPECT_EQ(
+      differencesOf(run, tracedRun({{"front", changed, 0}, {"back", frames, 0}})),
+      std::vector<std::string>(
+          {"A: stream front: frame 2, the first that differs, was number 1, captured at 11 ns, delivered at "
+           "12 ns, returned at 13 ns and is number 2, captured at -5 ns, delivered at 12 ns, returned at 14 ns"}));
+  EXPECT_EQ(differencesOf(run, tracedRun({{"back", shorter, 7}})),
+            std::vector<std::string>({"A: stream back: frame 3, the first that differs, is only in the first: number "
+                                      "2, captured at 21 ns, delivered at 22 ns, not returned",
+                                      "A: stream back: the number of lost frames was 0 and is 7",
+                                      "A: stream front is only in the first"}));
+  EXPECT_EQ(differencesOf(tracedRun({{"back", shorter, 0}}), run),
+            std::vector<std::string>({"A: stream back: frame 3, the first that differs, is only in the second: number "
+                                      "2, captured at 21 ns, delivered at 22 ns, not returned",
+                                      "A: stream front is only in the second"}));
+}
+
+TEST(DifferencesOf, LeaveOutTheFramesIfOneRecordHasNone) {
+  const RecordedRun traced = tracedRun({{"back", {{0, 1, 2, 3}}, 0}});
+  const RecordedRun untraced = runWith({recordOf("A", Verdict::kPass)});
+  EXPECT_THAT(differencesOf(traced, untraced), IsEmpty());
+  EXPECT_THAT(differencesOf(untraced, traced), IsEmpty());
+}
+
 TEST(DifferencesOf, TellWhichDiagnosticsOnlyOneRunHas) {
   const DiagnosticRecord a = recordOf("A", Verdict::kPass);
   const DiagnosticRecord b = recordOf("B", Verdict::kPass);

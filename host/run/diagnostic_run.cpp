@@ -251,11 +251,15 @@ class Run {
 void runDiagnostic(const Diagnostic& diagnostic, const ResolvedParameters& parameters, const RunOptions& options,
                    RunEventSink& events) {
   OneAtATime serial(events);
-  const std::shared_ptr<const Phone> phone = options.makePhone();
+  const std::shared_ptr<Phone> phone = options.makePhone();
   if (options.watchPhone) options.watchPhone(phone);
   Platform platform = phone->platform();
   {
     const LogOfRun log(platform.clock, options.logLevel, serial);
+    if (options.frames != nullptr) {
+      options.frames->begin(log.log()->begin());
+      phone->traceFrames(*options.frames);
+    }
     platform.concurrency = concurrencyOfRun(std::move(platform.concurrency), log.log());
     installPlatform(platform);
     Run run(diagnostic, parameters, *platform.clock, serial, options.isInterrupted);

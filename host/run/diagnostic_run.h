@@ -6,6 +6,7 @@
 #include "host/model/run_event.h"
 #include "host/plugin/diagnostic_registry.h"
 #include "host/plugin/parameters.h"
+#include "host/run/frame_teller.h"
 #include "host/run/log_limit.h"
 
 #include <functional>
@@ -22,6 +23,10 @@ struct RunOptions {
   LogLimit logLimit;  // of a run in a separate process, which then does not send what would not be kept
   // Called with the phone of each run before it is used, and may keep it; may be empty.
   std::function<void(const std::shared_ptr<const Phone>&)> watchPhone;
+  TraceSetting trace;  // what becomes events of a run in a separate process, or of runDiagnosticHere()
+  // Receives the frames of the phone, in the time of the log; may be null. runIsolated() and runDiagnosticHere() set
+  // it.
+  std::shared_ptr<FrameRings> frames;
 };
 
 // Runs the diagnostic on a new phone and sends its events to `events`, from the first stage to DiagnosticCompleted.

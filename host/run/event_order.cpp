@@ -17,8 +17,8 @@ bool EventOrder::accepts(const RunEvent& event) {
   return std::visit(
       [this](const auto& one) {
         using Event = std::remove_cvref_t<decltype(one)>;
-        if constexpr (isOneOf<Event, RunStarted, DiagnosticStarted, DiagnosticSkipped, Heartbeat, DiagnosticEnded,
-                              RunEnded>) {
+        if constexpr (isOneOf<Event, RunStarted, DiagnosticStarted, DiagnosticSkipped, Heartbeat, FramesTraced,
+                              DiagnosticEnded, RunEnded>) {
           return false;  // quazor's own
         } else if constexpr (isOneOf<Event, Logged>) {
           return true;  // at any time and on any thread

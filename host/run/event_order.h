@@ -15,6 +15,8 @@ class EventOrder {
 
   // The current stage or, between two stages and after all of them, the one that ended last.
   Stage stage() const { return stage_; }
+  // True from the beginning of the first stage.
+  bool hasBegun() const { return began_; }
   // True between two stages and after the last one.
   bool isBetweenStages() const { return began_ && !open_; }
   bool isCompleted() const { return completed_; }

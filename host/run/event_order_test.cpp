@@ -72,6 +72,8 @@ TEST(EventOrder, RefusesEveryOtherOrder) {
       {DiagnosticStarted{}},
       {DiagnosticEnded{}},
       {RunEnded{}},
+      {FramesTraced{}},
+      {started(Stage::kLoad), FramesTraced{}},
       {started(Stage::kLoad), started(Stage::kLoad)},
       {started(Stage::kLoad), started(Stage::kDescribe)},
       {started(Stage::kLoad), ended(Stage::kDescribe)},

@@ -9,6 +9,7 @@
 #include "host/record/run_event_json.h"
 #include "host/run/child_connection.h"
 #include "host/run/event_order.h"
+#include "host/run/frame_teller.h"
 #include "host/run/log_limit.h"
 #include "host/system/identity.h"
 #include "host/system/shared_counter.h"
@@ -52,16 +53,17 @@ class EventsToConnection final : public RunEventSink {
 class IsolatedRun {
  public:
   IsolatedRun(const Diagnostic& diagnostic, const Deadlines& deadlines, const IsolationOptions& options,
-              std::string token, SharedCounter& interrupted, Progress& progress, RunEventSink& events)
+              std::string token, SharedRunState& shared, Progress& progress, RunEventSink& events)
       : diagnostic_(diagnostic),
         deadlines_(deadlines),
         grace_(options.grace),
         heartbeat_(options.heartbeat),
         onInterrupt_(options.onInterrupt),
         token_(std::move(token)),
-        interrupted_(interrupted),
+        interrupted_(shared.interrupted),
         progress_(progress),
         events_(events) {
+    if (shared.frames != nullptr) frames_.emplace(*shared.frames, events);
     restartDeadline();
   }
 
@@ -76,7 +78,9 @@ class IsolatedRun {
     supervision.tick = [this] {
       progress_.update();
       beat();
+      areFramesUrgent_ = frames_ && order_.hasBegun() && frames_->update();
     };
+    supervision.isUrgent = [this] { return areFramesUrgent_; };
     return supervision;
   }
 
@@ -84,6 +88,7 @@ class IsolatedRun {
 
   // `leftOut` is the number of log lines that the process did not send.
   void conclude(const Supervised& end, std::uint64_t leftOut) {
+    if (frames_ && order_.hasBegun()) frames_->end();
     if (leftOut > 0) events_.onEvent(leftOutLine(leftOut, time_));
     if (droppedLines_ > 0) log(formatMessage("%@ more lines of output were dropped", droppedLines_));
     if (isInterrupted()) {  // the failure was told at once
@@ -185,6 +190,8 @@ class IsolatedRun {
   Progress& progress_;
   RunEventSink& events_;
   EventOrder order_;
+  std::optional<FrameTeller> frames_;  // nothing: frames are not told
+  bool areFramesUrgent_ = false;
   bool isInterrupted_ = false;
   const Moment begin_ = SteadyClock::now();
   Moment lastBeat_ = begin_;
@@ -261,7 +268,7 @@ bool superviseRun(const IsolationOptions& options, WatchedSignals& signals, cons
                                     "the process of " + diagnostic.name + " could not be created: " + problem.what())});
     return true;
   }
-  IsolatedRun run(diagnostic, deadlines, options, token, shared.interrupted, progress, events);
+  IsolatedRun run(diagnostic, deadlines, options, token, shared, progress, events);
   Supervised end = supervise(*child, signals, run.supervision(signals));
   child.reset();  // ends what the process has left behind
   end.lostConnection = shared.lost.get() != 0;
@@ -275,6 +282,9 @@ bool runIsolated(const IsolationOptions& options, WatchedSignals& signals, const
                  Progress& progress, RunEventSink& events) {
   SharedCounter frames;
   SharedRunState shared;
+  if (runOptions.trace.isOn && result == nullptr) {
+    shared.frames = std::make_shared<FrameRings>(runOptions.trace.framesPerStep);
+  }
   if (progress.isShown()) progress.countFrames([&frames] { return frames.get(); });
   const auto body = [&](RunEventSink& everything) {
     LimitedLog toParent(everything, runOptions.logLimit, shared.leftOut);
@@ -285,6 +295,7 @@ bool runIsolated(const IsolationOptions& options, WatchedSignals& signals, const
       analyzeResult(*loaded, parameters, *result, runOptions.logLevel, toParent);
     } else {
       RunOptions watched = runOptions;
+      watched.frames = shared.frames;
       watched.isInterrupted = [&shared] { return shared.interrupted.get() != 0; };
       if (progress.isShown()) {
         watched.watchPhone = [&frames](const std::shared_ptr<const Phone>& phone) { countFrames(phone, frames); };

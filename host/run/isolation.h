@@ -14,6 +14,7 @@
 #include <cstdint>
 #include <filesystem>
 #include <functional>
+#include <memory>
 #include <optional>
 #include <vector>
 
@@ -31,9 +32,10 @@ struct IsolationOptions {
 
 // Memory that quazor and the process of a run share.
 struct SharedRunState {
-  SharedCounter interrupted;  // 1 once the user has interrupted the run
-  SharedCounter leftOut;      // the number of log lines that the process did not send
-  SharedCounter lost;         // 1 if the process ended itself because its connection was gone
+  SharedCounter interrupted;             // 1 once the user has interrupted the run
+  SharedCounter leftOut;                 // the number of log lines that the process did not send
+  SharedCounter lost;                    // 1 if the process ended itself because its connection was gone
+  std::shared_ptr<FrameRings> frames{};  // of the phone of the run; null: its frames are not told
 };
 
 // Calls `body` in a separate process and passes on the events that it sends, from the first stage to

@@ -327,6 +327,7 @@ TEST_F(RunTest, ShowsTheFramesOfThePhoneInTheOtherProcess) {
     }
     std::vector<DeclaredFault> faults() const override { return {}; }
     std::uint64_t framesDelivered() const override { return 17; }
+    void traceFrames(FrameTrace& /*trace*/) override {}
   };
   runOptions_.makePhone = [] { return std::make_unique<SlowPhone>(); };
   Progress progress(&terminal_);

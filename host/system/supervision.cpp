@@ -17,6 +17,7 @@ using Moment = Supervision::Moment;
 using SteadyClock = std::chrono::steady_clock;
 
 constexpr std::chrono::milliseconds kTick = 100ms;
+constexpr std::chrono::milliseconds kUrgentTick = 1ms;
 // How long a finished child may take to exit, and any child after SIGTERM.
 constexpr std::chrono::milliseconds kGrace = 500ms;
 // How long a child that has closed its connection may take to exit, if its deadline is not sooner. On a busy machine
@@ -123,7 +124,8 @@ class Supervisor {
                                       {connection_.atEnd() ? -1 : connection_.descriptor(), POLLIN, 0},
                                       {output_.atEnd() ? -1 : output_.descriptor(), POLLIN, 0}}};
     const auto left = std::chrono::ceil<std::chrono::milliseconds>(nextMoment() - SteadyClock::now());
-    const auto timeout = std::clamp(left, std::chrono::milliseconds(0), kTick);
+    const bool isUrgent = supervision_.isUrgent && supervision_.isUrgent();
+    const auto timeout = std::clamp(left, std::chrono::milliseconds(0), isUrgent ? kUrgentTick : kTick);
     const WaitForChild waiting;
     ::poll(watched.data(), watched.size(), static_cast<int>(timeout.count()));
   }

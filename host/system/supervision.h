@@ -30,6 +30,8 @@ struct Supervision {
   std::function<bool()> mayFinish;
   // Called about ten times a second; may be empty.
   std::function<void()> tick;
+  // True if the next tick should come as soon as possible; may be empty.
+  std::function<bool()> isUrgent;
 };
 
 enum class SupervisionEnd {

@@ -30,6 +30,7 @@ class TestPhone : public Phone {
   }
   std::vector<DeclaredFault> faults() const override { return {{{{"operation", "x"}}, 3}}; }
   std::uint64_t framesDelivered() const override { return 17; }
+  void traceFrames(FrameTrace& /*trace*/) override {}
 
  private:
   std::shared_ptr<Clock> clock_ = std::make_shared<ManualClock>();

@@ -18,7 +18,7 @@ bool isOfHost(const RunEvent& event) {
   const auto* const failed = std::get_if<Failed>(&event);
   return std::holds_alternative<RunStarted>(event) || std::holds_alternative<DiagnosticStarted>(event) ||
          std::holds_alternative<DiagnosticEnded>(event) || std::holds_alternative<RunEnded>(event) ||
-         (failed != nullptr && !failed->stage);
+         std::holds_alternative<FramesTraced>(event) || (failed != nullptr && !failed->stage);
 }
 
 }  // namespace

@@ -85,6 +85,12 @@ void writeRecords(const fs::path& folder) {
   const std::string whole = recordText(wholeRun());
   records.add("whole", whole);
   records.add("cut_off", std::string_view(whole).substr(0, whole.size() - 9));
+  std::vector<RunEvent> traced = wholeRun();
+  std::get<RunStarted>(traced.front()).traced = true;
+  traced.insert(traced.begin() + 3, {FramesTraced{"front", 1, {{0, 5, 10, 20}, {1, 4, 11, std::nullopt}}, 0},
+                                     FramesTraced{"back", 2, {{0, -5, 10, 20}}, 7},
+                                     FramesTraced{"front", 2, {{2, 15, 20, 30}, {4, 16, 21, 31}}, 0}});
+  records.add("traced", recordText(traced));
   std::vector<RunEvent> interrupted = wholeRun();
   interrupted.back() = RunEnded{"Broken", momentAt(99)};
   records.add("interrupted", recordText(interrupted));

@@ -241,6 +241,7 @@ std::shared_ptr<CameraRun> LinuxCamera::begin(const CameraSettings& settings, Di
   plan.node = node_;
   plan.metadataNode = metadataNode_;
   plan.controls = controls_;
+  if (const auto found = cameras_->traced.find(port()); found != cameras_->traced.end()) plan.traced = found->second;
   auto begun = std::make_shared<CameraRun>(std::move(plan), cameras_->delivered);
   return begun->begin(error) ? begun : nullptr;
 }

@@ -2,6 +2,7 @@
 #pragma once
 
 #include "backends/capture/capture_back.h"
+#include "backends/capture/frame_trace.h"
 #include "backends/linux/binding/binding.h"
 #include "backends/linux/capture/camera_controls.h"
 #include "backends/linux/capture/camera_rate.h"
@@ -11,8 +12,10 @@
 #include "contract/value.h"
 
 #include <cstdint>
+#include <map>
 #include <memory>
 #include <optional>
+#include <string>
 #include <vector>
 
 namespace quazor {
@@ -27,7 +30,8 @@ struct LinuxCameras {
   const std::shared_ptr<V4l2Api> kernel;
   const DeviceRoots roots;
   const std::shared_ptr<DeliveredFrames> delivered = std::make_shared<DeliveredFrames>(0);
-  std::vector<V4l2DeviceInfo> nodes;  // as found before the cameras were opened
+  std::map<std::string, std::shared_ptr<TracedStream>> traced;  // by port; empty: the frames are not traced
+  std::vector<V4l2DeviceInfo> nodes;                            // as found before the cameras were opened
   MediaDevices media;
 };
 

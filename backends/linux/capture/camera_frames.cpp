@@ -11,12 +11,13 @@ FramePool& FramePool::shared() {
   return pool;
 }
 
-PixelBuffer& FramePool::take(Value metadata) {
+PixelBuffer& FramePool::take(Value metadata, TracedDelivery delivery) {
   const std::lock_guard lock(mutex_);
   if (free_.empty()) free_.push_back(&buffers_.emplace_back(*this));
   Buffer& buffer = *free_.back();
   free_.pop_back();
   buffer.metadata_ = std::move(metadata);
+  buffer.delivery_ = std::move(delivery);
   buffer.references_.store(1, std::memory_order_relaxed);
   return buffer;
 }
@@ -28,6 +29,7 @@ std::size_t FramePool::held() const {
 
 void FramePool::Buffer::release() {
   if (references_.fetch_sub(1, std::memory_order_acq_rel) != 1) return;
+  std::exchange(delivery_, {}).handBack();
   const std::optional<Value> metadata = std::exchange(metadata_, std::nullopt);  // destroyed without the lock
   const std::lock_guard lock(pool_.mutex_);
   pool_.free_.push_back(this);

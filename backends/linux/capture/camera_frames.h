@@ -1,6 +1,7 @@
 // The pixel buffers that handlers receive.
 #pragma once
 
+#include "backends/capture/frame_trace.h"
 #include "contract/value.h"
 #include "platform/pixel_buffer.h"
 
@@ -30,8 +31,9 @@ class FramePool final {
   // The pool of the process. It is never destroyed, because plug-ins may release buffers at any time, or never.
   static FramePool& shared();
 
-  // A buffer with one reference, owned by the caller. `metadata` becomes its attachment MetadataDictionary.
-  PixelBuffer& take(Value metadata);
+  // A buffer with one reference, owned by the caller. `metadata` becomes its attachment MetadataDictionary. `delivery`
+  // ends with the last reference.
+  PixelBuffer& take(Value metadata, TracedDelivery delivery = {});
   // The number of buffers in use.
   std::size_t held() const;
 
@@ -50,6 +52,7 @@ class FramePool final {
     FramePool& pool_;
     std::atomic<std::int64_t> references_{0};
     std::optional<Value> metadata_;
+    TracedDelivery delivery_;
   };
 
   mutable std::mutex mutex_;  // guards the members below

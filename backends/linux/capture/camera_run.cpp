@@ -33,6 +33,7 @@ CameraRun::CameraRun(CameraRunPlan plan, std::shared_ptr<DeliveredFrames> delive
       interval_(plan.interval),
       light_(std::move(plan.light)),
       delivered_(std::move(delivered)),
+      traced_(std::move(plan.traced)),
       pairing_(pairingOf(camera_.metadata, *plan.node)),
       handler_(std::move(plan.handler)),
       node_(std::move(plan.node)),
@@ -217,13 +218,15 @@ void CameraRun::hand(const CapturedFrame& frame) {
     logError("%@: frame %@ has no metadata: %@.", camera_.port, frame.sequence, pairing_.whyUnpaired(frame));
   }
   bool complete = false;
-  PixelBuffer& buffer = FramePool::shared().take(contents_->dictionaryOf(frame, &complete));
+  Value metadata = contents_->dictionaryOf(frame, &complete);
   if (!complete) {
     const std::lock_guard lock(mutex_);
     ++counts_.missingMetadata;
   }
   delivered_->fetch_add(1, std::memory_order_relaxed);
   const std::shared_ptr<PixelBufferHandler> handler = handler_;  // keeps the handler alive if it stops the stream
+  PixelBuffer& buffer =
+      FramePool::shared().take(std::move(metadata), TracedDelivery(traced_, frame.sequence, frame.timestamp));
   (*handler)(buffer, mediaTimeOf(frame.timestamp));
   buffer.release();
 }

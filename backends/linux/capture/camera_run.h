@@ -2,6 +2,7 @@
 #pragma once
 
 #include "backends/capture/capture_back.h"
+#include "backends/capture/frame_trace.h"
 #include "backends/linux/capture/camera_buffers.h"
 #include "backends/linux/capture/camera_counters.h"
 #include "backends/linux/capture/camera_metadata.h"
@@ -27,6 +28,7 @@ struct CameraRunPlan {
   std::shared_ptr<V4l2Device> node;
   std::shared_ptr<V4l2Device> metadataNode;  // may be null
   std::shared_ptr<const CameraControls> controls;
+  std::shared_ptr<TracedStream> traced;  // of the camera; null: its frames are not traced
 };
 
 // The number of frames passed to handlers, for all cameras.
@@ -72,6 +74,7 @@ class CameraRun final : public PolledStream, public CaptureRun {
   const FrameInterval interval_;
   const std::vector<ControlSetting> light_;
   const std::shared_ptr<DeliveredFrames> delivered_;
+  const std::shared_ptr<TracedStream> traced_;
 
   std::unique_ptr<CameraMetadata> contents_;
   std::vector<std::unique_ptr<ControlGuard>> guards_;  // one for each device that has controls of the projector

@@ -103,16 +103,23 @@ class LinuxCaptureBack final : public CaptureBack {
 class LinuxCaptureService final : public LinuxCapture {
  public:
   LinuxCaptureService(const Binding& binding, const std::shared_ptr<LinuxCameras>& shared)
-      : delivered_(shared->delivered),
-        service_(makeCheckedCapture(std::make_shared<LinuxCaptureBack>(binding, shared))) {}
+      : shared_(shared), service_(makeCheckedCapture(std::make_shared<LinuxCaptureBack>(binding, shared))) {
+    for (const CameraBinding& camera : binding.cameras) ports_.push_back(camera.port);
+  }
 
   std::shared_ptr<CapturePlugIn> createPlugIn() override { return service_->createPlugIn(); }
   std::shared_ptr<CapturePlugIn> defaultPlugIn() override { return service_->defaultPlugIn(); }
-  std::uint64_t framesDelivered() const override { return delivered_->load(std::memory_order_relaxed); }
+  std::uint64_t framesDelivered() const override { return shared_->delivered->load(std::memory_order_relaxed); }
+  void traceFrames(FrameTrace& trace, const std::shared_ptr<const Clock>& clock) override {
+    for (const std::string& port : ports_) {
+      shared_->traced[port] = trace.addStream(port, clock, WhenTraceIsFull::kLose);
+    }
+  }
 
  private:
-  const std::shared_ptr<DeliveredFrames> delivered_;
+  const std::shared_ptr<LinuxCameras> shared_;
   const std::shared_ptr<CaptureService> service_;
+  std::vector<std::string> ports_;  // of the cameras
 };
 
 }  // namespace

@@ -1,6 +1,7 @@
 // The capture service on V4L2: the cameras of a binding, each with its own video node.
 #pragma once
 
+#include "backends/capture/frame_trace.h"
 #include "backends/linux/binding/binding.h"
 #include "backends/linux/video/v4l2_api.h"
 #include "backends/linux/video/v4l2_device_info.h"
@@ -20,6 +21,9 @@ class LinuxCapture : public CaptureService {
  public:
   // The number of frames passed to handlers. Thread: any.
   virtual std::uint64_t framesDelivered() const = 0;
+  // Tells the trace each frame that is delivered from now on, under the port of its camera. Called before a device is
+  // made. `clock` is the steady clock, as the kernel's time stamps are.
+  virtual void traceFrames(FrameTrace& trace, const std::shared_ptr<const Clock>& clock) = 0;
 };
 
 std::shared_ptr<LinuxCapture> makeLinuxCapture(const Binding& binding);

@@ -19,6 +19,7 @@ std::shared_ptr<FrameDelivery> makeDelivery(const CaptureHardware& hardware, std
   source.index = index;
   source.camera = hardware.cameras[index].camera;
   source.run = times;
+  source.traced = hardware.cameras[index].traced;
   source.lit = toUnsigned(entryOf(&settings.lightSource, capture_key::Mode)) != 0;
   return std::make_shared<FrameDelivery>(std::move(source), hardware.pool, hardware.clock);
 }
@@ -77,6 +78,11 @@ void CaptureHardware::stop(SimulatedRun& run) {
   for (CameraState& camera : cameras) {
     if (camera.running.get() == &run) camera.running.reset();
   }
+}
+
+void CaptureHardware::traceFrames(FrameTrace& trace, WhenTraceIsFull whenFull) {
+  const std::lock_guard lock(mutex);
+  for (CameraState& state : cameras) state.traced = trace.addStream(state.camera.id, clock, whenFull);
 }
 
 std::chrono::nanoseconds CaptureHardware::streamedTime() const {

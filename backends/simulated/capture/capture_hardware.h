@@ -2,6 +2,7 @@
 #pragma once
 
 #include "backends/capture/capture_back.h"
+#include "backends/capture/frame_trace.h"
 #include "backends/simulated/capture/frame_delivery.h"
 #include "backends/simulated/capture/pixel_buffer_pool.h"
 #include "backends/simulated/capture/session_status.h"
@@ -32,6 +33,7 @@ struct SimulatedRun final : CaptureRun {
 struct CameraState {
   Camera camera;
   std::shared_ptr<SimulatedRun> running;  // null if the stream does not run
+  std::shared_ptr<TracedStream> traced;   // null if its frames are not traced
 
   // The highest frame rate of the current format.
   double formatMaximum(const CameraSettings& settings) const;
@@ -64,6 +66,8 @@ struct CaptureHardware {
   std::shared_ptr<SimulatedRun> start(std::size_t camera, const CameraSettings& settings);
   // Ends the run now, unless it has already ended; no further handler starts.
   void stop(SimulatedRun& run);
+  // Locks the mutex itself. Every stream that starts later tells its frames to the trace.
+  void traceFrames(FrameTrace& trace, WhenTraceIsFull whenFull);
   // The total time during which any stream has run.
   std::chrono::nanoseconds streamedTime() const;
 };

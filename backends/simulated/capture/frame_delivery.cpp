@@ -107,9 +107,17 @@ void FrameDelivery::deliver(std::uint64_t frame) {
 }
 
 void FrameDelivery::callHandler(std::uint64_t frame) {
-  PixelBuffer& buffer = pool_->take(source_.index, frame, attachment(frame));
-  (*source_.frames)(buffer, mediaTime(frameTime(source_.run.rate, frame)));
+  const std::chrono::nanoseconds time = frameTime(source_.run.rate, frame);
+  PixelBuffer& buffer = pool_->take(source_.index, frame, attachment(frame), source_.traced, atTime(time));
+  (*source_.frames)(buffer, mediaTime(time));
   buffer.release();
+}
+
+// By the phone's clock, saturated.
+std::chrono::nanoseconds FrameDelivery::atTime(std::chrono::nanoseconds sinceStart) const {
+  constexpr std::chrono::nanoseconds kMaximum = std::chrono::nanoseconds::max();
+  const std::chrono::nanoseconds started = source_.run.started;
+  return sinceStart > kMaximum - started ? kMaximum : started + sinceStart;
 }
 
 bool FrameDelivery::isDropped(std::uint64_t frame) const {

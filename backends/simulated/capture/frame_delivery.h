@@ -1,6 +1,7 @@
 // FrameDelivery: delivers the frames and events of one streaming run to its handlers.
 #pragma once
 
+#include "backends/capture/frame_trace.h"
 #include "backends/simulated/capture/pixel_buffer_pool.h"
 #include "backends/simulated/capture/session_status.h"
 #include "backends/simulated/scenario/scenario.h"
@@ -42,6 +43,7 @@ class FrameDelivery final : public std::enable_shared_from_this<FrameDelivery> {
     bool lit = false;                            // the projector, if any, is on
     std::shared_ptr<PixelBufferHandler> frames;  // either may be null
     std::shared_ptr<EventHandler> events;
+    std::shared_ptr<TracedStream> traced;  // null: the frames are not traced
   };
 
   FrameDelivery(Source source, std::shared_ptr<PixelBufferPool> pool, std::shared_ptr<Clock> clock);
@@ -73,6 +75,7 @@ class FrameDelivery final : public std::enable_shared_from_this<FrameDelivery> {
   bool isDropped(std::uint64_t frame) const;
   std::chrono::nanoseconds arrival(std::uint64_t frame) const;
   std::optional<Value> attachment(std::uint64_t frame) const;
+  std::chrono::nanoseconds atTime(std::chrono::nanoseconds sinceStart) const;
   std::chrono::nanoseconds sinceStart() const { return clock_->now() - source_.run.started; }
 
   const Source source_;

@@ -23,7 +23,15 @@ std::optional<Value> PixelBufferPool::Buffer::attachment(std::string_view key) c
   return metadata_;
 }
 
-PixelBuffer& PixelBufferPool::take(std::size_t camera, std::uint64_t frame, std::optional<Value> metadata) {
+PixelBuffer& PixelBufferPool::take(std::size_t camera, std::uint64_t frame, std::optional<Value> metadata,
+                                   const std::shared_ptr<TracedStream>& traced, std::chrono::nanoseconds captured) {
+  Buffer& buffer = takeFree(camera, frame, std::move(metadata));
+  buffer.delivery_ = TracedDelivery(traced, frame, captured);
+  return buffer;
+}
+
+PixelBufferPool::Buffer& PixelBufferPool::takeFree(std::size_t camera, std::uint64_t frame,
+                                                   std::optional<Value> metadata) {
   const std::lock_guard lock(mutex_);
   if (free_.empty()) free_.push_back(&buffers_.emplace_back(*this));
   Buffer& buffer = *free_.back();
@@ -37,6 +45,7 @@ PixelBuffer& PixelBufferPool::take(std::size_t camera, std::uint64_t frame, std:
 }
 
 void PixelBufferPool::putBack(Buffer& buffer) {
+  std::exchange(buffer.delivery_, {}).handBack();
   std::optional<Value> metadata;  // destroyed after the lock was released
   const std::lock_guard lock(mutex_);
   metadata.swap(buffer.metadata_);

@@ -1,14 +1,17 @@
 // PixelBufferPool: the image buffers of the simulated phone.
 #pragma once
 
+#include "backends/capture/frame_trace.h"
 #include "contract/value.h"
 #include "platform/pixel_buffer.h"
 
 #include <atomic>
+#include <chrono>
 #include <compare>
 #include <cstddef>
 #include <cstdint>
 #include <deque>
+#include <memory>
 #include <mutex>
 #include <optional>
 #include <string_view>
@@ -35,8 +38,10 @@ class PixelBufferPool final {
   PixelBufferPool(const PixelBufferPool&) = delete;
   PixelBufferPool& operator=(const PixelBufferPool&) = delete;
 
-  // A buffer with one reference, owned by the caller. `metadata` becomes its attachment MetadataDictionary.
-  PixelBuffer& take(std::size_t camera, std::uint64_t frame, std::optional<Value> metadata);
+  // A buffer with one reference, owned by the caller. `metadata` becomes its attachment MetadataDictionary. If there is
+  // a stream to tell, the frame, which was `captured` then, is delivered now, and handed back with the last reference.
+  PixelBuffer& take(std::size_t camera, std::uint64_t frame, std::optional<Value> metadata,
+                    const std::shared_ptr<TracedStream>& traced = nullptr, std::chrono::nanoseconds captured = {});
   // The buffers in use, by camera and frame.
   std::vector<Held> held() const;
   // The total number of buffers provided.
@@ -62,8 +67,10 @@ class PixelBufferPool final {
     bool out_ = false;  // guarded by the pool's mutex, like the members below while the buffer is not in use
     Held frame_;
     std::optional<Value> metadata_;
+    TracedDelivery delivery_;  // not guarded: of the thread that takes the buffer, then of the one that puts it back
   };
 
+  Buffer& takeFree(std::size_t camera, std::uint64_t frame, std::optional<Value> metadata);
   void putBack(Buffer& buffer);
 
   std::atomic<std::uint64_t> strayReleases_{0};
