@@ -1,6 +1,7 @@
 #include "base/text/nearest_name.h"
 
 #include <algorithm>
+#include <cctype>
 #include <iterator>
 
 namespace quazor {
@@ -41,6 +42,16 @@ std::optional<std::string> nearestName(std::string_view name, const std::vector<
 std::string didYouMean(std::string_view name, const std::vector<std::string>& candidates) {
   const std::optional<std::string> nearest = nearestName(name, candidates);
   return nearest ? "; did you mean '" + *nearest + "'?" : std::string();
+}
+
+std::string didYouMeanOf(std::string_view name, std::string_view what, const std::vector<std::string>& candidates) {
+  std::string list;
+  for (const std::string& one : candidates) list += (list.empty() ? "" : ", ") + one;
+  std::string suggestion = didYouMean(name, candidates);
+  std::string all(what);
+  if (!suggestion.empty()) all.front() = static_cast<char>(std::toupper(static_cast<unsigned char>(all.front())));
+  suggestion += suggestion.empty() ? "; " : " ";
+  return suggestion + all + " are " + (list.empty() ? "none" : list);
 }
 
 std::string didYouMeanOrPattern(std::string_view name, const std::vector<std::string>& candidates) {

@@ -20,6 +20,10 @@ std::optional<std::string> nearestName(std::string_view name, const std::vector<
 // "; did you mean 'NAME'?", or an empty text if no candidate is near: the end of an error message.
 std::string didYouMean(std::string_view name, const std::vector<std::string>& candidates);
 
+// Like didYouMean(), followed by all candidates: "; did you mean 'B'? The commands are A, B", or "; the commands are
+// A, B". `what` begins with a small letter, as in "the commands".
+std::string didYouMeanOf(std::string_view name, std::string_view what, const std::vector<std::string>& candidates);
+
 // Like didYouMean(), but the beginning of one candidate stands for that, and the beginning of several for the pattern
 // NAME* that fits them.
 std::string didYouMeanOrPattern(std::string_view name, const std::vector<std::string>& candidates);

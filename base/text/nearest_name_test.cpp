@@ -53,6 +53,12 @@ TEST(DidYouMean, EndsASentenceOrSaysNothing) {
   EXPECT_EQ(didYouMean("x", {"timeout", "duration"}), "");
 }
 
+TEST(DidYouMean, ListsAllCandidatesInASentenceOfItsOwnAfterAQuestion) {
+  EXPECT_EQ(didYouMeanOf("rn", "the commands", {"list", "run"}), "; did you mean 'run'? The commands are list, run");
+  EXPECT_EQ(didYouMeanOf("fly", "the commands", {"list", "run"}), "; the commands are list, run");
+  EXPECT_EQ(didYouMeanOf("fly", "the plug-ins there", {}), "; the plug-ins there are none");
+}
+
 TEST(DidYouMean, SuggestsAPatternForTheBeginningOfSeveral) {
   const std::vector<std::string> names = {"CameraSync.Back", "CameraSync.Front", "Tessel"};
   EXPECT_EQ(didYouMeanOrPattern("Camera", names), "; did you mean 'Camera*'?");

@@ -290,6 +290,7 @@ Options optionsOf(const CLI::App& command, const RawOptions& raw) {
   options.choice = choiceOf(raw.choice);
   options.inProcess = raw.inProcess;
   options.seed = parseWhole("--seed", raw.seed, 0, UINT64_MAX);
+  if (const CLI::Option* const seed = command.get_option_no_throw("--seed")) options.hasSeed = seed->count() > 0;
   options.seeds = parseWhole("--seeds", raw.seeds, 1, 1'000'000);
   options.memory = memoryOf(raw.memory);
   for (const std::string& text : raw.settings) options.settings.push_back(parseOverride(text));
@@ -321,10 +322,7 @@ void refuseUnknownCommand(const std::vector<std::string>& arguments) {
   const std::string& word = arguments.front();
   const std::vector<std::string> commands = commandNames();
   if (std::find(commands.begin(), commands.end(), word) != commands.end()) return;
-  std::string list;
-  for (const std::string& command : commands) list += (list.empty() ? "" : ", ") + command;
-  throw CommandError(ExitCode::kUsage,
-                     "unknown command '" + word + "'" + didYouMean(word, commands) + "; the commands are " + list);
+  throw CommandError(ExitCode::kUsage, "unknown command '" + word + "'" + didYouMeanOf(word, "the commands", commands));
 }
 
 void declareLookingCommands(CLI::App& app, RawOptions& raw) {
@@ -348,7 +346,8 @@ void declareRunningCommands(CLI::App& app, RawOptions& raw) {
   addNames(run, raw.names, "A diagnostic's");
   run.add_option("--only", raw.only,
                  "failed: rerun the diagnostics that did not pass in the last run, or in the record given with --of, "
-                 "with the same settings")
+                 "with the same settings, seed and tags. After --repeat or --attempts, the seed is that of the first "
+                 "entry that did not pass")
       ->type_name("failed")
       ->check(CLI::IsMember({"failed"}));
   run.add_option("--of", raw.of, "The record that --only refers to")->type_name("RECORD");
@@ -484,8 +483,9 @@ std::optional<Options> parseCommandLine(const std::vector<std::string>& given, s
     app.exit(answer, out, err);
     *code = ExitCode::kAllPassed;
   } catch (const CLI::ParseError& refusal) {
-    err << "quazor: " << printable(withoutMarks(refusal.what())) << "\nRun '" << helpCommandFor(given)
-        << "' for usage.\n";
+    const std::string unknown = unknownOptionIn(given);
+    err << "quazor: " << printable(unknown.empty() ? withoutMarks(refusal.what()) : unknown) << "\nRun '"
+        << helpCommandFor(given) << "' for usage.\n";
     *code = ExitCode::kUsage;
   } catch (const CommandError& refusal) {
     err << "quazor: " << printable(refusal.what()) << '\n';

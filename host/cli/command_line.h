@@ -15,6 +15,7 @@
 #include <chrono>
 #include <cstdint>
 #include <filesystem>
+#include <map>
 #include <optional>
 #include <ostream>
 #include <string>
@@ -69,7 +70,9 @@ struct Options {
   std::chrono::nanoseconds heartbeat{};  // zero: none
   std::optional<std::uint64_t> memory;   // limit of a plug-in process, in bytes; nothing: no limit
   std::uint64_t seed = 0;
-  std::uint64_t seeds = 0;  // the number of seeds, starting at 0
+  bool hasSeed = false;                         // --seed was given
+  std::map<std::string, std::uint64_t> seedOf;  // of a diagnostic whose seed is not that of the run
+  std::uint64_t seeds = 0;                      // the number of seeds, starting at 0
   std::optional<LogLevel> logLevel;
   LogLimit logLimit;  // of each diagnostic
   TraceSetting trace;

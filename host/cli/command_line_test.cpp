@@ -233,7 +233,13 @@ TEST(ParseCommandLine, RefusesWrongUsage) {
     const char* problem;
   };
   const Row rows[] = {
-      {{"rnu"}, "unknown command 'rnu'; did you mean 'run'?"},
+      {{"rnu"}, "unknown command 'rnu'; did you mean 'run'? The commands are list, describe, run, experiment"},
+      {{"analyze", "r", "--profil", "x"}, "unknown option '--profil'; did you mean '--profile'?\nRun 'quazor analyze"},
+      {{"diff", "a", "b", "--formt", "json"}, "unknown option '--formt'\n"},
+      {{"verify", "--recrd", "a"}, "unknown option '--recrd'"},
+      {{"explain", "206", "--formt=json"}, "unknown option '--formt'; did you mean '--format'?"},
+      {{"run", "--all", "--repeate", "3"}, "unknown option '--repeate'; did you mean '--repeat'?"},
+      {{"run", "--tag", "--repeate", "--rael", "A"}, "unknown option '--rael'"},
       {{"fly"}, "unknown command 'fly'; the commands are list, describe, run, experiment"},
       {{"run"}, "name the diagnostics to run, or use --all"},
       {{"run", "A", "--all"}, "either names of diagnostics or --all"},

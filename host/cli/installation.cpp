@@ -7,6 +7,7 @@
 
 #include <algorithm>
 #include <cstdlib>
+#include <map>
 #include <set>
 #include <system_error>
 #include <utility>
@@ -91,6 +92,8 @@ fs::path Installation::shippedPlugin() const {
   return !isThere(installed) && isThere(beside) ? beside : installed;
 }
 
+std::vector<fs::path> Installation::shippedPlugins() const { return pluginsIn(shippedPlugin().parent_path()); }
+
 std::vector<fs::path> Installation::pluginFolders() const {
   std::vector<fs::path> folders = foldersIn(user_.pluginPath);
   if (!user_.data.empty()) folders.push_back(user_.data / "plugins");
@@ -109,6 +112,19 @@ std::vector<fs::path> Installation::allPlugins() const {
   return all;
 }
 
+std::vector<HiddenPlugin> Installation::hiddenPlugins() const {
+  std::map<fs::path, fs::path> loaded;  // by file name
+  std::vector<HiddenPlugin> hidden;
+  for (const fs::path& folder : pluginFolders()) {
+    for (const fs::path& one : pluginsIn(folder)) {
+      const auto [by, isFirst] = loaded.emplace(one.filename(), one);
+      std::error_code ignored;
+      if (!isFirst && !fs::equivalent(by->second, one, ignored)) hidden.push_back({one, by->second});
+    }
+  }
+  return hidden;
+}
+
 std::vector<fs::path> Installation::defaultPlugins() const {
   std::vector<fs::path> plugins = allPlugins();
   std::erase_if(plugins, isLoadedOnlyWhenNamed);
@@ -122,12 +138,9 @@ fs::path Installation::plugin(const fs::path& name) const {
     if (one.filename() == name || one.stem() == name) return one;
     known.push_back(one.stem().string());
   }
-  std::string list;
-  for (const std::string& one : known) list += (list.empty() ? "" : ", ") + one;
   throw CommandError(ExitCode::kCannotRead, "the plug-in '" + name.string() +
                                                 "' does not exist, neither as a file nor in a folder of plug-ins" +
-                                                didYouMean(name.stem().string(), known) + "; the plug-ins there are " +
-                                                (list.empty() ? "none" : list));
+                                                didYouMeanOf(name.stem().string(), "the plug-ins there", known));
 }
 
 fs::path Installation::pluginTemplate() const { return data_ / "plugin_template"; }

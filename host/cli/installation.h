@@ -20,6 +20,12 @@ struct UserFolders {
 // The environment variable with more folders of plug-ins.
 inline constexpr const char* kPluginPathVariable = "QUAZOR_PLUGIN_PATH";
 
+// A plug-in that is not loaded because another one in an earlier folder has its file name.
+struct HiddenPlugin {
+  std::filesystem::path file;
+  std::filesystem::path by;
+};
+
 // An installation, found relative to the program: PREFIX/bin/quazor. A build tree has the same layout.
 //
 // Plug-ins are searched in the folders of QUAZOR_PLUGIN_PATH, in the user's folder and in the installed one, in this
@@ -36,10 +42,14 @@ class Installation {
 
   // The shipped plug-in: the installed one or, if there is none, the one next to the program.
   std::filesystem::path shippedPlugin() const;
+  // The plug-ins beside that one, sorted by name.
+  std::vector<std::filesystem::path> shippedPlugins() const;
   // All plug-ins in the folders above: the installed ones first, those of a folder sorted by name. Throws a
   // CommandError for a folder that cannot be read (kCannotRead), and for an entry of QUAZOR_PLUGIN_PATH that is empty
   // or relative (kUsage).
   std::vector<std::filesystem::path> allPlugins() const;
+  // Those that allPlugins() leaves out.
+  std::vector<HiddenPlugin> hiddenPlugins() const;
   // Those that are loaded if the user names none. Throws like allPlugins().
   std::vector<std::filesystem::path> defaultPlugins() const;
   // Resolves the argument of `--plugin`: returns `name` if it is a path or a file, else the plug-in NAME or NAME.so in

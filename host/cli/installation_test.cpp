@@ -31,6 +31,20 @@ TEST_F(InstallationTest, TakesThePluginBesideTheProgramWhereNoneIsInstalled) {
   EXPECT_EQ(installation().shippedPlugin(), installed);
 }
 
+TEST_F(InstallationTest, NamesThePluginsThatOthersHide) {
+  const std::filesystem::path shipped =
+      directory_.write(std::filesystem::path(QUAZOR_PLUGIN_DIRECTORY) / "camera_sensor_diagnostics.so", "");
+  const std::filesystem::path alone = directory_.write(std::filesystem::path(QUAZOR_PLUGIN_DIRECTORY) / "one.so", "");
+  const std::filesystem::path own = directory_.write("mine/plugins/camera_sensor_diagnostics.so", "");
+  const Installation mine(prefix_ / "bin/quazor", {prefix_ / "mine", ""});
+  EXPECT_THAT(mine.allPlugins(), testing::ElementsAre(alone, own));
+  const std::vector<HiddenPlugin> hidden = mine.hiddenPlugins();
+  ASSERT_EQ(hidden.size(), 1U);
+  EXPECT_EQ(hidden[0].file, shipped);
+  EXPECT_EQ(hidden[0].by, own);
+  EXPECT_TRUE(installation().hiddenPlugins().empty());
+}
+
 TEST_F(InstallationTest, FindsAnInstalledScenarioByItsName) {
   const std::filesystem::path installed =
       directory_.write(std::filesystem::path(QUAZOR_DATA_DIRECTORY) / "scenarios/sync/refused.json", "{}");

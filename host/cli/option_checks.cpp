@@ -1,5 +1,6 @@
 #include "host/cli/option_checks.h"
 
+#include "base/text/nearest_name.h"
 #include "contract/message_format.h"
 #include "host/device/phone.h"
 #include "host/error/exit_code.h"
@@ -10,7 +11,9 @@
 #include <CLI/CLI.hpp>
 
 #include <algorithm>
+#include <cstddef>
 #include <optional>
+#include <string>
 #include <vector>
 
 namespace quazor {
@@ -43,10 +46,15 @@ void warnOfSuffixes(const Options& options, std::ostream& err) {
     const std::optional<Format> other = otherFormatOfSuffix(output);
     if (!other) continue;
     const std::string name(nameOf(*other));
+    // Records have the suffix of OCP reports.
+    const std::string suggested = *other == Format::kOcp ? "a record or " + name : name;
     err << formatMessage("quazor: the %@ report goes to '%@', whose suffix suggests %@", nameOf(output.format),
-                         printable(output.file.string()), name);
+                         printable(output.file.string()), suggested);
     if (writesSeveralFormats(options.command)) {
-      err << "; for that, use --output " << printable(shellWord(name + ":" + output.file.string()));
+      const std::string file = output.file.string();
+      err << "; for that, use ";
+      if (*other == Format::kOcp) err << "--record " << printable(shellWord(file)) << " or ";
+      err << "--output " << printable(shellWord(formatMessage("%@:%@", name, file)));
     } else if (*other == Format::kText || *other == Format::kJson) {
       err << "; for that, use --format " << name;
     }
@@ -66,6 +74,23 @@ void checkNames(const Options& options, const std::string& what) {
   if (!options.onlyFailed && !options.failedOf.empty()) {
     throw CommandError(ExitCode::kUsage, "--of requires --only failed");
   }
+}
+
+std::string unknownOptionIn(const std::vector<std::string>& arguments) {
+  const std::vector<OptionSummary> options = optionsOfCommand(arguments.front());
+  if (options.empty()) return {};
+  std::vector<std::string> names;
+  names.reserve(options.size());
+  for (const OptionSummary& one : options) names.push_back(one.name);
+  for (std::size_t i = 1; i < arguments.size() && arguments[i] != "--"; ++i) {
+    if (!arguments[i].starts_with("--")) continue;
+    const std::string name = arguments[i].substr(0, arguments[i].find('='));
+    const auto known =
+        std::find_if(options.begin(), options.end(), [&name](const OptionSummary& one) { return one.name == name; });
+    if (known == options.end()) return "unknown option '" + name + "'" + didYouMean(name, names);
+    if (known->takesValue && name == arguments[i]) ++i;
+  }
+  return {};
 }
 
 }  // namespace quazor

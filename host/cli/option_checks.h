@@ -6,6 +6,7 @@
 #include <filesystem>
 #include <ostream>
 #include <string>
+#include <vector>
 
 namespace CLI {
 class App;
@@ -13,7 +14,7 @@ class App;
 
 namespace quazor {
 
-// All but warnOfSuffixes() throw a CommandError (kUsage).
+// All but warnOfSuffixes() and unknownOptionIn() throw a CommandError (kUsage).
 
 // CLI11 accepts an empty option value; quazor does not.
 void refuseEmpty(const CLI::App& command, const char* option);
@@ -26,5 +27,9 @@ void warnOfSuffixes(const Options& options, std::ostream& err);
 
 // Exactly one of names, --all and --only failed must be present.
 void checkNames(const Options& options, const std::string& what);
+
+// "unknown option '--profil'; did you mean '--profile'?" for the first option that the command does not have; empty if
+// it has them all. CLI11 may count an unknown option's value as a record or a name, and then complains of that.
+std::string unknownOptionIn(const std::vector<std::string>& arguments);
 
 }  // namespace quazor

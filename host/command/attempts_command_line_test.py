@@ -82,6 +82,18 @@ class AttemptsTest(RecordTest):
         recorded = [event["seed"] for event in events_in(self.record) if event["event"] == "diagnosticBegan"]
         self.assertEqual(len(recorded), 8)
 
+    def test_only_failed_repeats_the_first_entry_that_did_not_pass(self):
+        # Rounds of One and Two: One fails in the second, Two in the third.
+        document = self.document("ppfpff", "--repeat", "3", "--seed", "5", code=1)
+        seeds = {(one["name"], one["repetition"]): one["seed"] for one in document["diagnostics"]}
+        done = self.run_script("pp", "--only", "failed", "--of", self.record, "--format", "json", names=())
+        again = json.loads(done.stdout)
+        self.assertEqual({one["name"]: one["seed"] for one in again["diagnostics"]},
+                         {"Scripted.One": seeds["Scripted.One", 2], "Scripted.Two": seeds["Scripted.Two", 3]})
+        self.assertEqual(again["run"]["seed"], seeds["Scripted.One", 2])
+        done = self.run_script("pp", "--only", "failed", "--of", self.record, "--format", "json", "--seed", "5", names=())
+        self.assertEqual([one["seed"] for one in json.loads(done.stdout)["diagnostics"]], [5, 5])
+
     def test_without_the_options_nothing_is_added(self):
         for arguments in ((), ("--attempts", "1"), ("--repeat", "1")):
             document = self.document("p", *arguments)

@@ -2,6 +2,7 @@
 
 #include "host/command/completion.h"
 #include "host/command/explain_command.h"
+#include "host/command/output_check.h"
 #include "host/command/selection.h"
 #include "host/plugin/diagnostic_registry.h"
 #include "host/record/value_json.h"
@@ -128,6 +129,7 @@ void writeOutput(const ReportOptions& report, Console& console, const std::strin
     if (!console.out) throw CommandError(ExitCode::kCannotWrite, "standard output cannot be written");
     return;
   }
+  refuseRecordAsReport(report.output);
   writeOutputFile(report.output, output);
 }
 

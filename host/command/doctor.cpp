@@ -6,19 +6,39 @@
 #include "host/command/selection.h"
 #include "host/device/phone.h"
 #include "host/plugin/profile.h"
+#include "host/plugin/profile_check.h"
 #include "host/plugin/shared_object.h"
 #include "host/record/previous_run.h"
 #include "host/text/table.h"
 
+#include <unistd.h>
+
 #include <algorithm>
+#include <cerrno>
 #include <cstddef>
+#include <cstring>
 #include <functional>
 #include <string>
+#include <system_error>
 #include <utility>
+#include <vector>
 
 namespace quazor {
 
 namespace {
+
+// Why no file can be made at that place, for which missing folders would be made; empty if it can.
+std::string problemOfNewFile(const std::filesystem::path& file) {
+  std::filesystem::path folder = file.parent_path();
+  std::error_code error;
+  while (!folder.empty() && !std::filesystem::exists(std::filesystem::symlink_status(folder, error)) &&
+         folder != folder.parent_path()) {
+    folder = folder.parent_path();
+  }
+  if (!std::filesystem::is_directory(folder, error)) return "'" + folder.string() + "' is not a folder";
+  if (::access(folder.c_str(), W_OK | X_OK) == 0) return {};
+  return "'" + folder.string() + "': " + std::strerror(errno);
+}
 
 class Doctor {
  public:
@@ -33,6 +53,7 @@ class Doctor {
     for (const std::filesystem::path& plugin : plugins) {
       check("plug-in", plugin.string(), [&] { return findingOfPlugin(plugin); });
     }
+    checkHiddenPlugins();
     checkProfiles();
     checkPhones();
     check("explanations", installation_.explanations().back().string(),
@@ -54,12 +75,20 @@ class Doctor {
 
   void tell(bool fine, std::string_view kind, const std::string& name, const std::string& finding) {
     allFine_ = allFine_ && fine;
-    console_.out << (fine ? "ok       " : "REFUSED  ") << kind << ' ' << printable(name) << "\n           "
-                 << printable(finding) << '\n';
+    print(fine ? "ok       " : "REFUSED  ", kind, name, finding);
+  }
+
+  // Something that works, but may not be what the user meant.
+  void remark(std::string_view kind, const std::string& name, const std::string& finding) {
+    print("REMARK   ", kind, name, finding);
+  }
+
+  void print(std::string_view rating, std::string_view kind, const std::string& name, const std::string& finding) {
+    console_.out << rating << kind << ' ' << printable(name) << "\n           " << printable(finding) << '\n';
   }
 
   // Loads each plug-in alone: one that cannot be loaded must not hide another.
-  std::string findingOfPlugin(const std::filesystem::path& plugin) const {
+  std::string findingOfPlugin(const std::filesystem::path& plugin) {
     Options alone = options_;
     alone.plugins = {plugin};
     const PluginScan scan = scanOf(alone, installation_, [](const std::vector<Diagnostic>& all) { return all; });
@@ -67,6 +96,7 @@ class Doctor {
       throw CommandError(ExitCode::kCannotRead, scan.failed.front().error->localizedDescription());
     }
     std::size_t diagnostics = 0;
+    catalogue_.insert(catalogue_.end(), scan.catalogue.begin(), scan.catalogue.end());
     for (const DescribedDiagnostic& one : scan.catalogue) {
       if (one.description.error != nullptr) {
         throw CommandError(ExitCode::kCannotRead, one.diagnostic.name + " cannot be described: " +
@@ -78,6 +108,25 @@ class Doctor {
            (isLoadedOnlyWhenNamed(plugin) ? "; loaded only if --plugin names it" : "");
   }
 
+  void checkHiddenPlugins() {
+    for (const HiddenPlugin& one : installation_.hiddenPlugins()) {
+      remark("plug-in", one.file.string(),
+             "it is not loaded, because '" + one.by.string() +
+                 "' has its file name and hides it; to load both, rename that one");
+    }
+  }
+
+  // A profile may be for other plug-ins, so that an entry that fits nothing is no mistake in a run.
+  void remarkUnusedEntries(const Profile& profile) {
+    Profile strict = profile;
+    strict.mayNameOthers = false;
+    try {
+      checkProfile(strict, catalogue_);
+    } catch (const CommandError& problem) {
+      remark("profile", profile.file.string(), problem.what());
+    }
+  }
+
   // The default profile comes first, and is missed if it is not there.
   void checkProfiles() {
     const std::filesystem::path byDefault = installation_.defaultProfile();
@@ -86,14 +135,18 @@ class Doctor {
       const std::filesystem::path file = installation_.namedProfile(name);
       if (file != byDefault) files.push_back(file);
     }
+    // A plug-in that was refused or is hidden may have what an entry is for.
+    const bool allLoaded = allFine_ && installation_.hiddenPlugins().empty();
     for (const std::filesystem::path& file : files) {
+      Profile read;
       check("profile", file.string(), [&] {
         const std::vector<Profile> all = readProfileAndBases(file, installation_.profileSource());
         for (const Profile& one : all) one.mistakes.throwIfAny();
-        const Profile& read = all.back();
+        read = all.back();
         return "entries for " + countText(read.entries.size(), "diagnostic") + " and " +
                countText(read.experiments.size(), "experiment") + (file == byDefault ? "; the default profile" : "");
       });
+      if (allLoaded) remarkUnusedEntries(read);
     }
   }
 
@@ -132,6 +185,10 @@ class Doctor {
 
   void checkLastRun() {
     const std::filesystem::path file = previousRunFile();
+    if (const std::string problem = problemOfNewFile(file); !file.empty() && !problem.empty()) {
+      remark("last run", file.string(),
+             "it cannot be written, so that 'run --only failed' does not know the last run: " + problem);
+    }
     if (file.empty()) {
       tell(true, "last run", "-", "not recorded: neither XDG_STATE_HOME nor HOME is set");
     } else if (!hasPreviousRun(file)) {
@@ -145,6 +202,7 @@ class Doctor {
   const Options& options_;
   const Installation& installation_;
   Console& console_;
+  std::vector<DescribedDiagnostic> catalogue_;  // of all plug-ins that could be loaded
   bool allFine_ = true;
 };
 

@@ -28,9 +28,11 @@ class DoctorCase(CommandLineTest):
         self.assertEqual(len(lines) % 2, 0, result.stdout)
         found = []
         for head, finding in zip(lines[::2], lines[1::2]):
-            self.assertIn(head[:9], ("ok       ", "REFUSED  "))
+            self.assertIn(head[:9], ("ok       ", "REFUSED  ", "REMARK   "))
             self.assertTrue(finding.startswith(" " * 11), finding)
-            found.append((head.startswith("ok"), head[9:], finding[11:]))
+            found.append((not head.startswith("REFUSED"), head[9:], finding[11:]))
+        self.remarks = [(head[9:], finding[11:]) for head, finding in zip(lines[::2], lines[1::2])
+                        if head.startswith("REMARK")]
         return result.returncode, found
 
     def assert_refused(self, outcome, what, why):
@@ -53,6 +55,25 @@ class DoctorTest(DoctorCase):
         self.assertEqual(findings["sensor_images.so"], "0 diagnostics, 1 experiment; loaded only if --plugin names it")
         self.assertRegex(findings["backend simulated"], r"^created the healthy phone; \d+ phones installed$")
         self.assertEqual(findings["last_run.jsonl"], "no run recorded yet")
+        self.assertEqual(self.remarks, [])
+
+    def test_a_plug_in_that_hides_a_shipped_one_is_remarked(self):
+        folder = self.directory / "plugins"
+        folder.mkdir()
+        shutil.copy(STREAMING, folder / "sensor_images.so")
+        self.assertEqual(self.doctor(plugin_path=folder)[0], 0)
+        self.assertEqual(len(self.remarks), 1, self.remarks)
+        name, finding = self.remarks[0]
+        self.assertTrue(name.endswith("/lib/quazor/sensor_images.so"), name)
+        self.assertIn(f"not loaded, because '{folder}/sensor_images.so' has its file name and hides it", finding)
+
+    def test_a_place_for_the_last_run_that_cannot_be_written(self):
+        self.state.write_text("a file")
+        code, found = self.doctor()
+        self.assertEqual(code, 0, found)
+        self.assertEqual([finding for _, finding in self.remarks],
+                         [f"it cannot be written, so that 'run --only failed' does not know the last run: '{self.state}' "
+                          "is not a folder"])
 
     def test_plug_ins_are_looked_at_one_by_one(self):
         folder = self.directory / "plugins"
@@ -104,6 +125,16 @@ class BrokenInstallationTest(DoctorCase):
             shutil.copytree(built / "share/quazor" / name, self.data / name)
         self.addCleanup(setattr, command_line_fixture, "PROGRAM", PROGRAM)
         command_line_fixture.PROGRAM = str(root / "bin" / pathlib.Path(PROGRAM).name)
+
+    def test_an_entry_of_a_profile_for_a_diagnostic_that_no_plug_in_has_is_remarked(self):
+        path = self.data / "profiles/default.json"
+        whole = path.read_text()
+        self.assertIn('"TesselFaultDiagnostic"', whole)
+        path.write_text(whole.replace('"TesselFaultDiagnostic"', '"TeselFaultDiagnostic"'))
+        self.assertEqual(self.doctor()[0], 0)
+        self.assertEqual([name for name, _ in self.remarks], [f"profile {path}"])
+        self.assertRegex(self.remarks[0][1], r"default\.json:7: .*TeselFaultDiagnostic.*no diagnostic has this name; "
+                         r"did you mean .TesselFaultDiagnostic.\?")
 
     def test_data_that_cannot_be_used(self):
         kinds = {"scenarios/healthy.json": "backend simulated", "scenarios/camera_sync/frames_dropped.json": "phone",

@@ -88,6 +88,23 @@ std::vector<std::filesystem::path> pluginsToLoadAgain(const RecordedRun& run, bo
   return {run.began.plugins.begin(), run.began.plugins.end()};
 }
 
+// The seed with which the diagnostic can be expected not to pass again: that of its first entry that did not pass. One
+// that never started has that of the run.
+std::uint64_t seedToRepeat(const RecordedRun& run, const std::string& name) {
+  for (const DiagnosticRecord& one : run.records) {
+    if (one.name == name && one.verdict != Verdict::kPass) return one.seed;
+  }
+  return run.began.seed;
+}
+
+// The run gets the seed of the first diagnostic, and the others keep their own.
+void repeatSeeds(const RecordedRun& run, Options& options) {
+  // A seed means nothing on a machine, neither in that run nor in this one.
+  if (bindingNamed(run.began.phone) || bindingNamed(options.phone) || options.names.empty()) return;
+  for (const std::string& name : options.names) options.seedOf[name] = seedToRepeat(run, name);
+  options.seed = options.seedOf[options.names.front()];
+}
+
 }  // namespace
 
 Options optionsToRunAgain(Options options, const Installation& installation) {
@@ -104,11 +121,15 @@ Options optionsToRunAgain(Options options, const Installation& installation) {
   if (options.plugins.empty()) options.plugins = pluginsToLoadAgain(run, isOwn(record, options), installation);
   if (options.phone.empty()) {
     options.phone = run.began.phone;
-    if (bindingNamed(options.phone) && (options.realTime || options.seed != 0)) {
+    if (bindingNamed(options.phone) && (options.realTime || options.hasSeed)) {
       throw CommandError(ExitCode::kUsage, "--seed and --realtime apply only to simulated phones, but that run used '" +
                                                run.began.phone + "'; choose another phone with --phone");
     }
   }
+  if (!options.hasSeed) repeatSeeds(run, options);
+  OrderedMap<std::string> tags = run.began.tags;
+  for (const auto& [key, value] : options.tags) tags.set(key, value);
+  options.tags = std::move(tags);
   // The record contains the values of the installed profile, which may have changed since or not have been used.
   const bool allRecorded = options.recorded->entries.size() == options.names.size();
   if (options.profile.empty() && allRecorded) options.withoutProfile = true;

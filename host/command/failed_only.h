@@ -8,10 +8,10 @@ namespace quazor {
 
 // Completes the options of `run --only failed` from the record given by --of, or from that of the previous run: the
 // names of the diagnostics that did not pass; the recorded parameters, with lower priority than all that are given now;
-// and the phone and plug-ins unless they are given. The names are empty if everything passed. Throws a CommandError:
-// kCannotRead if there is no such record, if a plug-in could not be loaded in that run, or if the record is not the
-// user's own of the previous run and names a plug-in that is not installed; kUsage for a seed or real time if that
-// run's phone was not simulated.
+// and the phone, the plug-ins and the seeds unless they are given; and the tags, of which those given now win. The
+// names are empty if everything passed. Throws a CommandError: kCannotRead if there is no such record, if a plug-in
+// could not be loaded in that run, or if the record is not the user's own of the previous run and names a plug-in that
+// is not installed; kUsage for a seed or real time if that run's phone was not simulated.
 Options optionsToRunAgain(Options options, const Installation& installation);
 
 }  // namespace quazor

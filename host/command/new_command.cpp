@@ -1,6 +1,7 @@
 #include "host/command/commands.h"
 
 #include "base/text/input_error.h"
+#include "host/command/selection.h"
 #include "host/error/exit_code.h"
 #include "host/system/output_file.h"
 
@@ -18,6 +19,7 @@
 #include <string>
 #include <string_view>
 #include <system_error>
+#include <utility>
 #include <vector>
 
 namespace quazor {
@@ -76,6 +78,33 @@ std::string replaced(std::string text, std::string_view from, const std::string&
 
 std::string adapted(const std::string& text, const std::string& name) {
   return replaced(replaced(text, kTemplateName, name), kTemplateClass, classNameOf(name));
+}
+
+// An installed plug-in of that file name would be hidden or hide the new one, and two plug-ins with one name of a
+// diagnostic, an experiment or an analysis cannot be loaded together.
+void checkIsNew(const std::string& name, const Options& options, const Installation& installation) {
+  IsolationOptions isolation = isolationOf(options, installation);
+  isolation.plugins = installation.allPlugins();
+  isolation.unasked = true;  // one that cannot be loaded has no names
+  for (const fs::path& one : isolation.plugins) {
+    if (one.stem() == name) refuseName(name, "the plug-in '" + one.string() + "' has it; choose another one");
+  }
+  if (isolation.plugins.empty()) return;
+  WatchedSignals signals;
+  const PluginScan scan =
+      scanPlugins(isolation, signals, [](const std::vector<Diagnostic>&) { return std::vector<Diagnostic>(); });
+  if (signals.requestsToEnd() > 0) throw CommandError(ExitCode::kInterrupted, "interrupted; nothing was made");
+  const std::string words = classNameOf(name);
+  for (const DescribedDiagnostic& described : scan.catalogue) {
+    const Diagnostic& one = described.diagnostic;
+    for (const auto& [taken, kind] : {std::pair(one.name, one.experimentOnly ? "Experiment" : "Diagnostic"),
+                                      std::pair(one.analysisName, "Analysis")}) {
+      if (taken != words + kind) continue;
+      const std::string plugin = one.plugins.empty() ? std::string() : one.plugins.front().string();
+      refuseName(name, "it would register '" + taken + "', as '" + plugin +
+                           "' does, and the two could not be loaded together; choose another one");
+    }
+  }
 }
 
 // The files of the template with the names of the project.
@@ -151,6 +180,7 @@ ExitCode newCommand(const Options& options, const Installation& installation, Co
   const bool isThere = fs::exists(fs::symlink_status(folder, error));
   if (isThere && !fs::is_directory(folder, error)) refuseFolder(given, "there is a file of that name");
   if (isThere && !fs::is_empty(folder, error)) refuseFolder(given, "the folder is not empty");
+  checkIsNew(name, options, installation);
   const std::vector<TemplateFile> files = projectFiles(installation.pluginTemplate(), name);
   NewFolder made(folder);
   for (const TemplateFile& file : files) made.write(file);

@@ -58,6 +58,17 @@ class NewCommandTest(CommandLineTest):
         self.assertEqual(quazor("new").returncode, 64)
         self.assertEqual(quazor("new", "one", "two").returncode, 64)
 
+    def test_names_of_installed_plug_ins_and_their_diagnostics_are_refused(self):
+        before = self.content()
+        self.assert_refused(quazor("new", self.directory / "single_camera"), 64,
+                            "'single_camera' cannot be the name of a plug-in: the plug-in '", "/single_camera.so' has it",
+                            "choose another one")
+        self.assert_refused(quazor("new", self.directory / "nimbe_image"), 64,
+                            "it would register 'NimbeImageExperiment', as '", "/sensor_images.so' does",
+                            "choose another one")
+        self.assert_refused(quazor("new", self.directory / "tessel_fault"), 64, "'TesselFaultDiagnostic'")
+        self.assertEqual(self.content(), before)
+
     def test_selftest_judges_the_phones_of_a_project(self):
         self.assertEqual(quazor("new", self.directory / "event_count").returncode, 0)
         phones = sorted((self.directory / "event_count/phones").glob("*.json"))

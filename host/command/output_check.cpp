@@ -3,6 +3,7 @@
 #include "host/device/phone.h"
 #include "host/error/exit_code.h"
 #include "host/record/previous_run.h"
+#include "host/record/record_file.h"
 #include "host/system/output_file.h"
 
 #include <sys/stat.h>
@@ -56,6 +57,13 @@ std::vector<fs::path> inputsOf(const Options& options, const Installation& insta
 
 }  // namespace
 
+void refuseRecordAsReport(const fs::path& file) {
+  if (!isRecord(file)) return;
+  throw CommandError(ExitCode::kCannotWrite, "the file '" + file.string() +
+                                                 "' is a record, which a report would replace; choose another file for "
+                                                 "the report, or remove the record first");
+}
+
 void checkOutputs(const Options& options, const Installation& installation, const RunStarted& began) {
   const std::vector<fs::path> inputs = inputsOf(options, installation, began);
   std::vector<fs::path> outputs;
@@ -74,6 +82,7 @@ void checkOutputs(const Options& options, const Installation& installation, cons
   const auto checkReport = [&check](const fs::path& file) {
     validateOutputFile(file);
     check(file);
+    refuseRecordAsReport(file);
   };
   check(options.record);
   // A folder that will be made for the record.

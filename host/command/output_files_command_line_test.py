@@ -37,6 +37,21 @@ class OutputFilesTest(CommandLineTest):
                     self.assert_untouched(self.record, quazor("run", "--only", "failed", "--of", self.record, *PLUGIN, *option))
         self.assert_untouched(self.record, quazor("analyze", hard, *PLUGIN, "--record", symbolic))
 
+    def test_a_report_never_replaces_a_record(self):
+        old = self.record.read_bytes()
+        for command in (("run", "Fake.One", "--phone", self.phone, "--profile", "none", "--set", "duration=1"),
+                        ("list",)):
+            for option in (("--output", self.record), ("--format", "json", "--output", self.record)):
+                with self.subTest(command=command, option=option):
+                    self.assert_refused(quazor(*command, *PLUGIN, *option), 73,
+                                        f"the file '{self.record}' is a record, which a report would replace; choose "
+                                        "another file for the report, or remove the record first")
+                    self.assertEqual(self.record.read_bytes(), old)
+        self.assert_refused(self.run_fake("--output", f"ocp:{self.record}"), 73, "is a record")
+        ocp = self.directory / "ocp.jsonl"
+        for _ in range(2):  # a report is replaced
+            self.assertEqual(self.run_fake("--output", f"ocp:{ocp}").returncode, 0)
+
     def test_the_phone_the_profile_the_parameters_and_the_plug_in(self):
         profile = self.write("profile.json", '{"schema": 1, "entries": []}')
         parameters = self.write("parameters.json", "{}")
@@ -202,7 +217,7 @@ class OutputFilesTest(CommandLineTest):
 
     def test_a_suffix_that_contradicts_the_format_is_a_warning(self):
         for output, form, suggested in (("junit:r.json", "junit", "json"), ("json:r.xml", "json", "junit"),
-                                        ("r.JSON", "text", "json"), ("csv:r.txt", "csv", "text"), ("json:r.jsonl", "json", "ocp")):
+                                        ("r.JSON", "text", "json"), ("csv:r.txt", "csv", "text")):
             with self.subTest(output):
                 file = output.split(":")[-1]
                 result = self.run_fake("--output", output, cwd=self.directory)
@@ -211,6 +226,10 @@ class OutputFilesTest(CommandLineTest):
                     f"quazor: the {form} report goes to '{file}', whose suffix suggests {suggested}; for that, use "
                     f"--output {suggested}:{file}"])
                 self.assertTrue((self.directory / file).exists())
+        result = self.run_fake("--output", "json:r.jsonl", cwd=self.directory)
+        self.assertEqual(self.told(result), [
+            "quazor: the json report goes to 'r.jsonl', whose suffix suggests a record or ocp; for that, use --record "
+            "r.jsonl or --output ocp:r.jsonl"])
         for output in ("junit:r.xml", "json:r.json", "ocp:r.jsonl", "ocp:r.json", "r.txt", "r.log", "csv:r.csv", "junit:r.pdf", "r"):
             with self.subTest(output):
                 result = self.run_fake("--output", output, cwd=self.directory)

@@ -132,10 +132,23 @@ class PluginReview {
     }
     const std::size_t before = findings_.size();
     for (const auto& [kind, name] : names) add(reviewName(kind, name));
+    reviewFileName();
     reviewClashes(names);
     if (findings_.size() == before) {
       tell(Rating::kOk, "name",
            formatMessage("%@, of the usual form and used by no installed plug-in", countText(names.size(), "name")));
+    }
+  }
+
+  // A plug-in of the user that has the name of a shipped one hides it. One's own installed plug-in is an earlier build.
+  void reviewFileName() {
+    std::error_code ignored;
+    for (const fs::path& shipped : installation_.shippedPlugins()) {
+      if (shipped.filename() != plugin_.filename() || fs::equivalent(shipped, plugin_, ignored)) continue;
+      tell(Rating::kAdvice, "name",
+           formatMessage("'%@' has the same file name, and is not loaded where this one is installed for a user; give "
+                         "this one another name",
+                         shipped.string()));
     }
   }
 

@@ -85,6 +85,16 @@ class ShippedTest(ReviewCase):
         self.assertIn("\n2 plug-ins: 0 problems, ", result.stdout)
 
 
+class FileNameTest(ReviewCase):
+    def test_the_file_name_of_a_shipped_plug_in_is_advised_against(self):
+        plugin = self.directory / "single_camera.so"
+        shutil.copy(PLUGINS / "sleep_accuracy.so", plugin)
+        findings = self.review(plugin, "--set", "duration=0.2")
+        self.assert_said("advice", "^name: '.*/lib/quazor/single_camera.so' has the same file name, and is not loaded",
+                         findings)
+        self.assertNotIn("used by no installed plug-in", "".join(self.texts("ok", findings)))
+
+
 class ExampleTest(ReviewCase):
     def test_the_example_of_the_guide(self):
         findings = self.review(PLUGINS / "sleep_accuracy.so", "--set", "duration=0.2")

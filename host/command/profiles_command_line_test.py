@@ -218,7 +218,7 @@ class SuggestedNamesTest(ProfilesCase):
 
 class HelpTest(CommandLineTest):
     def test_an_unknown_option_leads_to_the_help_of_its_command(self):
-        self.assert_refused(quazor("run", "--all", "--nonsense"), 64, "--nonsense\nRun 'quazor run --help' for usage.\n")
+        self.assert_refused(quazor("run", "--all", "--nonsense"), 64, "unknown option '--nonsense'\nRun 'quazor run --help' for usage.\n")
         self.assert_refused(quazor("verify"), 64, "Run 'quazor verify --help' for usage.\n")
         self.assert_refused(quazor("--nonsense"), 64, "Run 'quazor --help' for usage.\n")
 

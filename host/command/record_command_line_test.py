@@ -324,11 +324,31 @@ class OnlyFailedTest(RecordTest):
         result = quazor("run", "--only", "failed", "--set", "minimum=0", env=self.state)
         self.assertEqual(result.returncode, 0, result.stderr)
 
+    def test_it_has_the_seed_and_the_tags_of_that_run(self):
+        given = ("--seed", "7043", "--tag", "serial=C02X", "--tag", "station=S3", "--set", "minimum=90")
+        self.assertEqual(self.run_fake(*given, env=self.state).returncode, 1)
+
+        def rerun(*arguments):
+            document = json.loads(self.only_failed("--format", "json", *arguments).stdout)
+            return document["run"]["seed"], document["diagnostics"][0]["seed"], document["run"]["tags"]
+
+        # The rerun is the last run then, so that a seed that was given stays.
+        self.assertEqual(rerun("--set", "minimum=90"), (7043, 7043, {"serial": "C02X", "station": "S3"}))
+        self.assertEqual(rerun("--set", "minimum=90", "--tag", "station=S4"),
+                         (7043, 7043, {"serial": "C02X", "station": "S4"}))
+        self.assertEqual(rerun("--seed", "0", "--set", "minimum=90")[:2], (0, 0))
+
+    def test_a_record_in_which_everything_passed_is_named(self):
+        self.recorded()
+        result = self.only_failed("--of", self.record)
+        self.assertEqual(result.returncode, 0, result.stderr)
+        self.assertTrue(result.stdout.startswith(f"Everything passed in the run of '{self.record}'.\n"), result.stdout)
+
     def test_a_seed_is_not_ignored_where_the_phone_of_that_run_was_a_machine(self):
         binding = self.write("machine.json", '{"title": "Nothing"}')
         result = quazor("run", "Broken.Nothing", "--plugin", WORKING, "--phone", f"linux:{binding}", env=self.state)
         self.assertEqual(result.returncode, 2, result.stderr)
-        for option in (["--seed", "3"], ["--realtime"]):
+        for option in (["--seed", "3"], ["--seed", "0"], ["--realtime"]):
             result = quazor("run", "--only", "failed", *option, env=self.state)
             self.assert_refused(result, 64, "only to simulated phones, but that run used 'linux:")
         self.assertEqual(quazor("run", "--only", "failed", env=self.state).returncode, 2)
@@ -386,6 +406,10 @@ class OnlyFailedTest(RecordTest):
             with self.subTest(state):
                 result = self.run_fake(env={"XDG_STATE_HOME": state, "HOME": str(self.directory)})
                 self.assertEqual(result.returncode, 0, result.stderr)
+                warnings = [line for line in result.stderr.splitlines() if line.startswith("quazor: ")]
+                self.assertEqual(len(warnings), 1 if state == str(self.phone) else 0, warnings)
+                for warning in warnings:
+                    self.assertRegex(warning, "^quazor: 'run --only failed' will not know this run: .* cannot be written: ")
 
 
 class OutputsTest(RecordTest):

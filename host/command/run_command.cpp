@@ -141,7 +141,9 @@ ExitCode performNothing(const Options& options, const Installation& installation
   const auto events = beginEvents(options, installation, began, false, console);
   events->onEvent(std::move(began));
   const bool isForPeople = options.report.format == Format::kText || !options.report.output.empty();
-  (isForPeople ? console.out : console.err) << "Everything passed in the last run.\n" << std::flush;
+  const std::string which =
+      options.failedOf.empty() ? "in the last run" : "in the run of '" + options.failedOf.string() + "'";
+  (isForPeople ? console.out : console.err) << "Everything passed " << printable(which) << ".\n" << std::flush;
   events->onEvent(RunEnded{std::nullopt, dateNow()});
   events->requireRecords();
   return events->exitCode();
@@ -204,7 +206,9 @@ ExitCode runCommand(const Options& given, const Installation& installation, Cons
     std::optional<Skip> skip = skipOf(one.described.diagnostic.name, options.choice.skips);
     if (!skip) skip = skipOf(one.described.diagnostic.name, phone.absent);
     DiagnosticErrorPtr problem = skip ? nullptr : missingParameter(one, options, installation);
-    jobs.push_back({std::move(one), nullptr, options.seed, std::move(skip), std::move(problem)});
+    const auto own = options.seedOf.find(one.described.diagnostic.name);
+    const std::uint64_t seed = own == options.seedOf.end() ? options.seed : own->second;
+    jobs.push_back({std::move(one), nullptr, seed, std::move(skip), std::move(problem)});
   }
   RunOptions runOptions;
   runOptions.logLevel = options.logLevel.value_or(LogLevel::kDefault);

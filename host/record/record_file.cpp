@@ -321,6 +321,20 @@ StoredRecord readRecord(const std::filesystem::path& file, const std::function<v
   return stored;
 }
 
+bool isRecord(const std::filesystem::path& file) {
+  std::error_code ignored;
+  if (!std::filesystem::is_regular_file(file, ignored)) return false;
+  std::ifstream stream(file, std::ios::binary);
+  std::string line;
+  if (!readLine(stream, line)) return false;
+  try {
+    const Json json = parseJsonLine(line);
+    return memberOf(json, "sequence") == 0 && memberOf(json, "record").is_number();
+  } catch (const InputError&) {
+    return false;
+  }
+}
+
 RecordedRun runIn(const std::filesystem::path& file) {
   refuseFolderAsRecord(file);
   StoredRecord stored = readRecord(file);

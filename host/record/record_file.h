@@ -81,6 +81,9 @@ class RecordDefect : public CommandError {
 StoredRecord readRecord(const std::filesystem::path& file,
                         const std::function<void(std::uint64_t bytes)>& onProgress = nullptr);
 
+// True if the first line of the file is that of a record. False for a file that cannot be read.
+bool isRecord(const std::filesystem::path& file);
+
 // The frames of a stream in one run of a diagnostic.
 struct RecordedStream {
   std::string name;

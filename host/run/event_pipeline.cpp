@@ -15,15 +15,20 @@ namespace {
 
 constexpr std::chrono::seconds kMaxWaitOfInterrupt{1};
 
+void tellLastRunIsLost(const std::string& why, std::ostream& err) {
+  err << "quazor: 'run --only failed' will not know this run: " << printable(why) << '\n' << std::flush;
+}
+
 // The record of the previous run; null if it cannot be created. The user did not request it, so that is no failure.
-std::unique_ptr<RecordWriter> lastRunRecord() {
+std::unique_ptr<RecordWriter> lastRunRecord(std::ostream& err) {
   const std::filesystem::path file = previousRunFile();
   if (file.empty()) return nullptr;
   std::error_code ignored;
   std::filesystem::create_directories(file.parent_path(), ignored);
   try {
     return std::make_unique<RecordWriter>(file, RecordWriter::Existing::kReplaceAll);  // the last run to begin counts
-  } catch (const CommandError&) {
+  } catch (const CommandError& problem) {
+    tellLastRunIsLost(problem.what(), err);
     return nullptr;
   }
 }
@@ -46,7 +51,7 @@ EventPipeline::EventPipeline(const EventPipelineOptions& options, Console& conso
   }
   required_ = records_.size();
   if (options.keepsLastRun) {
-    if (std::unique_ptr<RecordWriter> last = lastRunRecord()) records_.push_back(std::move(last));
+    if (std::unique_ptr<RecordWriter> last = lastRunRecord(console.err)) records_.push_back(std::move(last));
   }
   if (options.systemLog) systemLog_ = systemLogOfThisMachine();
 }
@@ -78,6 +83,9 @@ void EventPipeline::pass(const RunEvent& event) {
   if (std::holds_alternative<DiagnosticEnded>(event)) report_.addRecord(builder_.takeRecord());
   if (std::holds_alternative<RunEnded>(event)) {
     ended_ = true;
+    for (std::size_t i = required_; i < records_.size(); ++i) {
+      if (!records_[i]->problem().empty()) tellLastRunIsLost(problemOf(*records_[i]), console_.err);
+    }
     if (tellsRecord_) tellRecord();
   }
 }
