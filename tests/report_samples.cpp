@@ -165,7 +165,7 @@ class Generator {
       if (attempt > 1 && record.skip) continue;
       record.trial = {run.attempts == 0 ? 0 : attempt, run.attempts, run.repetitions == 0 ? 0 : round, run.repetitions};
       sample.records.push_back(std::move(record));
-      if (sample.records.back().verdict != Verdict::kError) return;
+      if (sample.records.back().verdict != Verdict::kError || hasFailedResult(sample.records.back())) return;
     }
   }
 

@@ -76,9 +76,9 @@ TEST_F(BindingTest, ANodeMayBeSelectedByItsPlace) {
       read(withNode(R"("driver": "d", "usbInterface": 2, "path": "/sys/devices/a")")).cameras.at(0).node;
   EXPECT_EQ(match, (VideoNodeMatch{"d", {}, {}, 2, "/sys/devices/a"}));
   EXPECT_EQ(read(withNode("\"path\": \"/sys/devices/a\"")).cameras.at(0).node.path, "/sys/devices/a");
-  EXPECT_EQ(
-      problemOf(withNode("\"usbInterface\": 2")),
-      node + ": give at least one of \"driver\", \"card\", \"busInfo\", \"path\" and \"name\"; 'quazor phone probe' shows them.");
+  EXPECT_EQ(problemOf(withNode("\"usbInterface\": 2")), node +
+                                                            ": give at least one of \"driver\", \"card\", \"busInfo\", "
+                                                            "\"path\" and \"name\"; 'quazor phone probe' shows them.");
   EXPECT_EQ(problemOf(withNode(R"("driver": "d", "usbInterface": 256)")),
             node + ".usbInterface: must be an integer from 0 to 255, not 256.");
   EXPECT_EQ(problemOf(withNode("\"path\": \"/dev/video0\"")),

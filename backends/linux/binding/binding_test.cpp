@@ -157,7 +157,8 @@ TEST_F(BindingTest, RefusesWhatCamerasCannotBe) {
       {"no node", with(R"("cameras": {"BackFacingCamera": {"size": {"width": 1, "height": 1}}})"),
        "F:2: cameras.BackFacingCamera: the key \"node\" is missing."},
       {"a node that is anything", with(R"("cameras": {"BackFacingCamera": {"node": {}}})"),
-       "F:2: cameras.BackFacingCamera.node: give at least one of \"driver\", \"card\", \"busInfo\", \"path\" and \"name\"; "
+       "F:2: cameras.BackFacingCamera.node: give at least one of \"driver\", \"card\", \"busInfo\", \"path\" and "
+       "\"name\"; "
        "'quazor phone probe' shows them."},
       {"no size", with(R"("cameras": {"BackFacingCamera": {"node": {"card": "c"}}})"),
        "F:2: cameras.BackFacingCamera: the key \"size\" is missing."},
