@@ -3,6 +3,7 @@
 #include "backends/linux/system/linux_error.h"
 #include "backends/linux/video/v4l2_device.h"
 #include "contract/log_channel.h"
+#include "contract/message_format.h"
 
 #include <algorithm>
 #include <charconv>
@@ -61,7 +62,7 @@ std::string textOf(const MediaDeviceMatch& match) {
 }
 
 std::string linkText(const PadName& source, const PadName& sink) {
-  return "\"" + textOf(source) + "\" -> \"" + textOf(sink) + "\"";
+  return formatMessage("\"%@\" -> \"%@\"", textOf(source), textOf(sink));
 }
 
 std::string listOf(const std::vector<std::string>& texts) {
