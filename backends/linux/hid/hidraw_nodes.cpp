@@ -1,5 +1,6 @@
 #include "backends/linux/hid/hidraw_nodes.h"
 
+#include "backends/linux/system/node_number.h"
 #include "base/text/input_error.h"
 
 #include <fcntl.h>
@@ -8,7 +9,7 @@
 #include <algorithm>
 #include <array>
 #include <cerrno>
-#include <charconv>
+#include <cstdint>
 #include <cstring>
 #include <fstream>
 #include <optional>
@@ -21,18 +22,7 @@ namespace {
 
 namespace fs = std::filesystem;
 
-constexpr std::string_view kPrefix = "hidraw";
-
 fs::path classDirectory(const HidrawRoots& roots) { return roots.sysfs / "class" / "hidraw"; }
-
-// The number in "hidraw7"; nothing for other names.
-std::optional<unsigned> numberOf(const std::string& name) {
-  if (!name.starts_with(kPrefix)) return std::nullopt;
-  unsigned number = 0;
-  const char* const end = name.data() + name.size();
-  const auto [rest, error] = std::from_chars(name.data() + kPrefix.size(), end, number);
-  return error == std::errc() && rest == end ? std::optional(number) : std::nullopt;
-}
 
 std::optional<Bytes> contentOf(const fs::path& file) {
   std::ifstream stream(file, std::ios::binary);
@@ -95,11 +85,11 @@ fs::path hidrawDevice(const HidrawRoots& roots, const fs::path& path) {
 }
 
 std::vector<HidrawNode> hidrawNodes(const HidrawRoots& roots) {
-  std::vector<std::pair<unsigned, std::string>> names;
+  std::vector<std::pair<std::uint32_t, std::string>> names;
   std::error_code gone;
   for (fs::directory_iterator entry(classDirectory(roots), gone), end; !gone && entry != end; entry.increment(gone)) {
     const std::string name = entry->path().filename();
-    if (const std::optional<unsigned> number = numberOf(name)) names.emplace_back(*number, name);
+    if (const std::optional<std::uint32_t> number = nodeNumber(name, "hidraw")) names.emplace_back(*number, name);
   }
   std::ranges::sort(names);
   std::vector<HidrawNode> nodes;

@@ -1,12 +1,12 @@
 #include "backends/linux/media/media_device.h"
 
 #include "backends/linux/system/linux_error.h"
+#include "backends/linux/system/node_number.h"
 #include "backends/linux/video/v4l2_device.h"
 #include "contract/log_channel.h"
 #include "contract/message_format.h"
 
 #include <algorithm>
-#include <charconv>
 #include <fstream>
 #include <string_view>
 #include <system_error>
@@ -17,17 +17,6 @@ namespace {
 
 // Controllers have some dozens of entities; the limit stops a driver that tells nonsense.
 constexpr std::uint32_t kMaxItems = 65536;
-
-// The N of "mediaN"; nothing for other names.
-std::optional<std::uint32_t> numberOf(std::string_view name) {
-  constexpr std::string_view kPrefix = "media";
-  if (!name.starts_with(kPrefix)) return std::nullopt;
-  name.remove_prefix(kPrefix.size());
-  std::uint32_t number = 0;
-  const auto [end, problem] = std::from_chars(name.data(), name.data() + name.size(), number);
-  if (problem != std::errc() || end != name.data() + name.size()) return std::nullopt;
-  return number;
-}
 
 MediaDeviceInfo ask(V4l2Api& kernel, const std::filesystem::path& path) {
   MediaDeviceInfo info{path, {}, {}, {}, nullptr};
@@ -79,7 +68,7 @@ std::vector<MediaDeviceInfo> mediaDevices(const std::shared_ptr<V4l2Api>& kernel
   std::filesystem::directory_iterator entry(roots.sysfs / "bus" / "media" / "devices", problem);
   for (; !problem && entry != std::filesystem::directory_iterator(); entry.increment(problem)) {
     const std::string name = entry->path().filename().string();
-    if (const auto number = numberOf(name)) numbered.emplace_back(*number, ask(*kernel, roots.dev / name));
+    if (const auto number = nodeNumber(name, "media")) numbered.emplace_back(*number, ask(*kernel, roots.dev / name));
   }
   std::ranges::sort(numbered, {}, [](const auto& one) { return one.first; });
   std::vector<MediaDeviceInfo> devices;

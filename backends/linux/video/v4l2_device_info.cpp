@@ -1,6 +1,7 @@
 #include "backends/linux/video/v4l2_device_info.h"
 
 #include "backends/linux/system/linux_error.h"
+#include "backends/linux/system/node_number.h"
 #include "backends/linux/video/v4l2_device.h"
 
 #include <sys/stat.h>
@@ -13,17 +14,6 @@
 
 namespace quazor {
 namespace {
-
-// The N of "videoN"; nothing for other names (radios, sub-devices).
-std::optional<std::uint32_t> numberOf(std::string_view name) {
-  constexpr std::string_view kPrefix = "video";
-  if (!name.starts_with(kPrefix)) return std::nullopt;
-  name.remove_prefix(kPrefix.size());
-  std::uint32_t number = 0;
-  const auto [end, problem] = std::from_chars(name.data(), name.data() + name.size(), number);
-  if (problem != std::errc() || end != name.data() + name.size()) return std::nullopt;
-  return number;
-}
 
 std::string firstLineOf(const std::filesystem::path& file) {
   std::ifstream stream(file);
@@ -105,7 +95,7 @@ std::vector<V4l2DeviceInfo> videoNodes(const std::shared_ptr<V4l2Api>& kernel, c
   std::filesystem::directory_iterator entry(roots.sysfs / "class" / "video4linux", problem);
   for (; !problem && entry != std::filesystem::directory_iterator(); entry.increment(problem)) {
     const std::string name = entry->path().filename().string();
-    const std::optional<std::uint32_t> number = numberOf(name);
+    const std::optional<std::uint32_t> number = nodeNumber(name, "video");  // radios and sub-devices have other names
     if (!number) continue;
     V4l2DeviceInfo node;
     node.path = roots.dev / name;
