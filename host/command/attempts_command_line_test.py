@@ -145,6 +145,10 @@ class AttemptsTest(RecordTest):
         self.assertEqual(list(dict.fromkeys((row["diagnostic"], row["attempt"], row["repetition"]) for row in rows)),
                          [("Scripted.One", "1", "1"), ("Scripted.One", "2", "1"), ("Scripted.Two", "1", "1"),
                           ("Scripted.Two", "2", "1"), ("Scripted.One", "1", "2"), ("Scripted.Two", "1", "2")])
+        seeds = {(row["diagnostic"], row["attempt"], row["repetition"]): row["seed"] for row in rows}
+        self.assertEqual(seeds["Scripted.One", "1", "1"], "0")
+        self.assertEqual(len(set(seeds.values())), 3)  # attempts and repetitions of one number share a seed
+        self.assertEqual(list(seeds.values()), [one["seed"] for one in properties])
         lines = [json.loads(line) for line in (self.directory / "o").read_text().splitlines()]
         starts = [line["testRunArtifact"]["testRunStart"]["metadata"] for line in lines
                   if "testRunStart" in line.get("testRunArtifact", {})]

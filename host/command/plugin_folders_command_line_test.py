@@ -52,6 +52,18 @@ class FoundPluginsTest(PluginFoldersTest):
         verdicts = {one["name"]: one["verdict"] for one in json.loads(result.stdout)["diagnostics"]}
         self.assertEqual((verdicts[SHIPPED], verdicts["Fake.One"]), ("pass", "pass"))
 
+    def test_a_plug_in_for_which_the_memory_is_too_little_names_the_option(self):
+        result = self.quazor("list", "--memory", "1")
+        self.assertEqual(result.returncode, 66, result.stderr)
+        self.assertIn("failed to map segment from shared object; its process may use 1 MiB of memory; --memory raises that "
+                      "limit\n", result.stderr)
+
+    def test_a_plug_in_for_which_the_memory_is_too_little_names_the_option(self):
+        result = self.quazor("list", "--memory", "1")
+        self.assertEqual(result.returncode, 66, result.stderr)
+        self.assertIn("failed to map segment from shared object; its process may use 1 MiB of memory; --memory raises that "
+                      "limit\n", result.stderr)
+
     def test_folders_of_the_environment_hide_the_users_which_hide_the_installed(self):
         shutil.copy(WORKING, self.own / "mine.so")
         self.assertIn("Fake.One", self.listed())
