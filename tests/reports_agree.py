@@ -258,6 +258,9 @@ class Comparison:
                          if result.name == one["name"] and float(result.value) == float(one[key])]
                 self.check(f"{where}: {one['name']}: the first repetition with the {key}", one[f"{key}Repetition"],
                            first[0] if first else None)
+            for each, entry in zip(repeated, entries):
+                if each["repetition"] == one["outlierRepetition"]:
+                    self.check(f"{where}: {one['name']}: seed", one["outlierSeed"], each["seed"])
             self.kinds["a result that varied"] += 1
 
     def check_identity(self, name, run, streams, suites):
@@ -341,7 +344,7 @@ class Comparison:
             got = report_readers.read_text(lines, expected)
             self.check_record(f"{name} {place} text", blurred(got), blurred(expected))
         if any(one["repetition"] for one in records):
-            title = b"What varied between the repetitions" + b" (#: the first repetition with that value)" * varies + b":"
+            title = b"What varied between the repetitions" + b" (#: the first repetition with that value; Outlier: the one that differs most, and its seed)" * varies + b":"
             self.check(f"{name} text: variation", lines.block()[0], title)
         left = [line.decode("utf-8", "replace") for line in lines.rest()]
         self.check(f"{name} text: end", blurred(left), blurred([*end, ""]))
