@@ -4,8 +4,6 @@ The information that a format contains is a dictionary; `expected_of_FORM` deriv
 """
 
 import collections
-import csv
-import io
 import json
 import math
 import re
@@ -15,8 +13,6 @@ import report_limits
 
 VERDICTS = {("COMPLETE", "PASS"): "pass", ("COMPLETE", "FAIL"): "fail", ("ERROR", "NOT_APPLICABLE"): "error",
             ("SKIP", "NOT_APPLICABLE"): "skip"}
-CSV_HEADER = ("diagnostic,verdict,result,value,unit,limit,lower,lowerOpen,upper,upperOpen,resultVerdict,"
-              "errorStage,errorDomain,errorCode,errorMessage").split(",")
 
 Result = collections.namedtuple("Result", "name value unit limit verdict")
 Limit = collections.namedtuple("Limit", "name lower upper")  # bounds are (value, open)
@@ -335,52 +331,6 @@ def expected_of_junit(record):
         "junit errors": errors and [in_xml(f"{errors[0].domain}:{errors[0].code}"), in_xml(errors[0].message),
                                     in_xml(lines)],
     }
-
-
-# --- CSV ---
-
-
-def csv_rows(content):
-    rows = csv.reader(io.StringIO(content.decode("utf-8", "replace"), newline=""))
-    return [[re.sub(r"^'('*[=+\-@\t\r])", r"\1", cell) for cell in row] for row in rows]  # protected from spreadsheets
-
-
-def read_csv(rows, header):
-    """Converts a diagnostic's lines to a record."""
-    if any(row[:2] != rows[0][:2] or row[11:] != rows[0][11:] for row in rows):
-        raise ValueError("lines of one diagnostic differ in what they say of it")
-    first = dict(zip(CSV_HEADER, rows[0]))
-    results = []
-    for row in rows:
-        it = dict(zip(CSV_HEADER, row))
-        if it["value"] == "":
-            continue
-        flags = {"1": True, "0": False}
-        bounds = [(number(it[which]), flags[it[which + "Open"]]) if it[which] else None for which in ("lower", "upper")]
-        results.append(Result(it["result"], number(it["value"]), it["unit"], Limit(it["limit"], *bounds),
-                              it["resultVerdict"]))
-    errors = [Error(first["errorDomain"], int(first["errorCode"]), first["errorMessage"])] if first["errorCode"] else []
-    more = dict(zip(header[len(CSV_HEADER):], rows[0][len(CSV_HEADER):]))
-    skip = (more.get("skipKind"), more.get("skipReason"))
-    return {"name": first["diagnostic"], "verdict": first["verdict"], "results": results, "errors": errors,
-            "error stage": first["errorStage"], "skip": skip if any(skip) else None,
-            "attempt": whole(more.get("attempt") or None), "repetition": whole(more.get("repetition") or None)}
-
-
-def expected_of_csv(record):
-    """No limit looks like a limit without name and bounds, and there is only one error."""
-    results = [one._replace(limit=one.limit or NO_LIMIT) for one in report_limits.rows_of(record, Limit)]
-    return {"name": record["name"], "verdict": record["verdict"], "results": results, "errors": record["errors"][:1],
-            "skip": record["skip"], "attempt": record["attempt"], "repetition": record["repetition"]}
-
-
-def read_experiment_csv(rows):
-    """The measurements of all experiments."""
-    columns = {name: rows[0].index(name) for name in ("experiment", "measurement", "value", "unit") if name in rows[0]}
-    if len(columns) < 4:
-        return []
-    cells = [[row[columns[name]] for name in ("experiment", "measurement", "value", "unit")] for row in rows[1:]]
-    return [(experiment, name, number(value), unit) for experiment, name, value, unit in cells if value]
 
 
 # --- The text ---

@@ -19,6 +19,7 @@ import sys
 import tempfile
 import xml.etree.ElementTree
 
+import csv_reader
 import ocp_rules
 import record_reader
 import report_limits
@@ -186,7 +187,10 @@ class Comparison:
         self.check_unrecorded(name, streams[len(records):], suites[len(records):], records, interrupted)
         identity = json.loads(reports["json"])["run"]
         self.check_identity(name, identity, streams, suites)
-        rows = self.without_identity(name, report_readers.csv_rows(reports["csv"]), identity)
+        rows = csv_reader.csv_rows(reports["csv"])
+        seeds = self.without_identity(name, rows, identity)
+        self.check(f"{name} csv: seeds", seeds, [str(one["seed"]) for one in records
+                                                 for _ in range(csv_reader.lines_of(one, of_experiments))])
         self.compare_csv(name, rows, of_experiments, records)
         never_began = sum(one.end["status"] == "SKIP" for one in streams[len(records):])
         end = list(text_end(records, of_experiments, interrupted, run, never_began))
@@ -254,6 +258,9 @@ class Comparison:
                          if result.name == one["name"] and float(result.value) == float(one[key])]
                 self.check(f"{where}: {one['name']}: the first repetition with the {key}", one[f"{key}Repetition"],
                            first[0] if first else None)
+            for each, entry in zip(repeated, entries):
+                if each["repetition"] == one["outlierRepetition"]:
+                    self.check(f"{where}: {one['name']}: seed", one["outlierSeed"], each["seed"])
             self.kinds["a result that varied"] += 1
 
     def check_identity(self, name, run, streams, suites):
@@ -272,15 +279,20 @@ class Comparison:
                        [run["tags"]["serial"]] if "serial" in run["tags"] else [])
 
     def without_identity(self, name, rows, run):
-        """The lines of a table without the cells that say which run it was."""
+        """Removes the cells that say which run it was from the lines of a table. Returns the seeds of its entries."""
+        seeds = []
         cells = {"run": run["id"], "date": run["date"], "host": run["host"], "program": run["program"],
                  "contract": str(run["contract"]), "plugins": "; ".join(run["plugins"]), "phone": run["phone"],
-                 "seed": str(run["seed"]), **{f"tag.{key}": value for key, value in run["tags"].items()}}
+                 "seed": None, **{f"tag.{key}": value for key, value in run["tags"].items()}}
         for place, row in enumerate(rows):
-            expected = list(cells.values() if place else cells)
-            self.check(f"{name} csv: run", row[-len(expected):], expected)
-            del row[-len(expected):]
-        return rows
+            found = dict(zip(cells, row[-len(cells):]))
+            if place:
+                seeds.append(found["seed"])
+                self.check(f"{name} csv: run", found | {"seed": None}, cells)
+            else:
+                self.check(f"{name} csv: columns of the run", list(found.values()), list(cells))
+            del row[-len(cells):]
+        return seeds
 
     def check_unrecorded(self, name, streams, suites, records, interrupted):
         self.check(f"{name}: unrecorded", [one.get("name") for one in suites],
@@ -301,16 +313,16 @@ class Comparison:
     def compare_csv(self, name, rows, of_experiments, records):
         if of_experiments:
             expected = [(record["name"], *one) for record in records for one in record["measurements"]]
-            self.check(f"{name} csv", report_readers.read_experiment_csv(rows), expected)
+            self.check(f"{name} csv", csv_reader.read_experiment_csv(rows), expected)
             return
         of_skips = ["skipKind", "skipReason"] if any(one["skip"] for one in records) else []
         trials = [key for key in ("attempt", "repetition") if any(one[key] for one in records)]
         header = rows.pop(0)
-        self.check(f"{name} csv: header", header, [*report_readers.CSV_HEADER, *of_skips, *trials])
+        self.check(f"{name} csv: header", header, [*csv_reader.CSV_HEADER, *of_skips, *trials])
         for place, record in enumerate(records):
-            count = max(1, len(record["results"]) + sum(map(len, record["checks"])))
-            got = report_readers.read_csv(rows[:count], header)
-            self.check_record(f"{name} {place} csv", got, report_readers.expected_of_csv(record))
+            count = csv_reader.lines_of(record, of_experiments)
+            got = csv_reader.read_csv(rows[:count], header)
+            self.check_record(f"{name} {place} csv", got, csv_reader.expected_of_csv(record))
             if record["error stage"] is not None:
                 self.check(f"{name} {place} csv: stage", got["error stage"], record["error stage"])
             del rows[:count]
@@ -332,7 +344,7 @@ class Comparison:
             got = report_readers.read_text(lines, expected)
             self.check_record(f"{name} {place} text", blurred(got), blurred(expected))
         if any(one["repetition"] for one in records):
-            title = b"What varied between the repetitions" + b" (#: the first repetition with that value)" * varies + b":"
+            title = b"What varied between the repetitions" + b" (#: the first repetition with that value; Outlier: the one that differs most, and its seed)" * varies + b":"
             self.check(f"{name} text: variation", lines.block()[0], title)
         left = [line.decode("utf-8", "replace") for line in lines.rest()]
         self.check(f"{name} text: end", blurred(left), blurred([*end, ""]))

@@ -145,6 +145,10 @@ class AttemptsTest(RecordTest):
         self.assertEqual(list(dict.fromkeys((row["diagnostic"], row["attempt"], row["repetition"]) for row in rows)),
                          [("Scripted.One", "1", "1"), ("Scripted.One", "2", "1"), ("Scripted.Two", "1", "1"),
                           ("Scripted.Two", "2", "1"), ("Scripted.One", "1", "2"), ("Scripted.Two", "1", "2")])
+        seeds = {(row["diagnostic"], row["attempt"], row["repetition"]): row["seed"] for row in rows}
+        self.assertEqual(seeds["Scripted.One", "1", "1"], "0")
+        self.assertEqual(len(set(seeds.values())), 3)  # attempts and repetitions of one number share a seed
+        self.assertEqual(list(seeds.values()), [one["seed"] for one in properties])
         lines = [json.loads(line) for line in (self.directory / "o").read_text().splitlines()]
         starts = [line["testRunArtifact"]["testRunStart"]["metadata"] for line in lines
                   if "testRunStart" in line.get("testRunArtifact", {})]
@@ -164,10 +168,11 @@ class AttemptsTest(RecordTest):
 
     def test_what_varied(self):
         done = self.run_script("ppfpepfp", "--repeat", "4", "--output", f"json:{self.output}")
-        self.assertIn("What varied between the repetitions (#: the first repetition with that value):\n"
+        self.assertIn("What varied between the repetitions (#: the first repetition with that value; Outlier: the one "
+                      "that differs most, and its seed):\n"
                       "Scripted.One: 1 passed, 2 failed, 1 ended in an error\n"
-                      "  Result  Count  Minimum  #  Median  Maximum  #  Unit    Limit\n"
-                      "  Value       3        1  2       1       10  1  frames  Enough: >= 5\n"
+                      "  Result  Count  Minimum  #  Median  Maximum  #  Outlier  Seed  Unit    Limit\n"
+                      "  Value       3        1  2       1       10  1        1     0  frames  Enough: >= 5\n"
                       "  1 other result never varied\n"
                       "Scripted.Two: 4 passed\n"
                       "  2 results never varied\n", done.stdout)
@@ -177,7 +182,16 @@ class AttemptsTest(RecordTest):
         self.assertEqual([(it["name"], it["values"], it["minimum"], it["median"], it["maximum"], it["limit"]["name"])
                           for it in one["varying"]], [("Value", 3, 1, 1, 10, "Enough")])
         self.assertEqual([(it["minimumRepetition"], it["maximumRepetition"]) for it in one["varying"]], [(2, 1)])
+        self.assertEqual([(it["outlierRepetition"], it["outlierSeed"]) for it in one["varying"]], [(1, 0)])
         self.assertEqual((one["constant"], two["constant"], two["varying"]), (1, 2, []))
+
+    def test_the_outlier_can_be_run_alone(self):
+        document = self.document("ppppfppp", "--repeat", "4", "--seed", "5", code=1)
+        [value] = document["variation"][0]["varying"]
+        seeds = {one["repetition"]: one["seed"] for one in document["diagnostics"]}
+        self.assertEqual((value["outlierRepetition"], value["outlierSeed"]), (3, seeds[3]))
+        alone = self.document("f", "--seed", value["outlierSeed"], code=1)
+        self.assertEqual(alone["diagnostics"][0]["seed"], seeds[3])
 
     def test_the_text_of_repetitions_has_a_line_for_each_and_what_did_not_pass(self):
         script = "ppfpep"
@@ -216,12 +230,14 @@ class AttemptsTest(RecordTest):
     def test_what_varied_has_the_limits_of_the_user(self):
         done = self.run_script("ppfp", "--repeat", "2", "--limit", "Scripted.One:Value >= 3 frames", "--limit",
                                "Value == 10 +- 9", "--output", f"json:{self.output}")
-        self.assertIn("  Result  Count  Minimum  #  Median  Maximum  #  Unit    Limit\n"
-                      "  Value       2        1  2     5.5       10  1  frames  Enough: >= 5\n"
-                      "  Value       2        1  2     5.5       10  1  frames  Value >= 3 frames (command line)\n"
-                      "  Value       2        1  2     5.5       10  1  frames  Value == 10 +- 9 (command line)\n"
-                      "  1 other result never varied\n", done.stdout)
         one, _ = json.loads(self.output.read_text())["variation"]
+        seed = one["varying"][0]["outlierSeed"]
+        row = f"  Value       2        1  2     5.5       10  1        2  {seed}  frames  "
+        self.assertIn(f"  Result  Count  Minimum  #  Median  Maximum  #  Outlier  {'Seed':>{len(str(seed))}}  Unit    Limit\n"
+                      f"{row}Enough: >= 5\n"
+                      f"{row}Value >= 3 frames (command line)\n"
+                      f"{row}Value == 10 +- 9 (command line)\n"
+                      "  1 other result never varied\n", done.stdout)
         self.assertEqual(one["varying"][0]["userLimits"],
                          [{"limit": "Scripted.One:Value >= 3 frames", "name": "", "severity": "fail", "source": "command line"},
                           {"limit": "Value == 10 +- 9", "name": "", "severity": "fail", "source": "command line"}])
@@ -231,7 +247,7 @@ class AttemptsTest(RecordTest):
                                command="experiment")
         self.assertEqual(done.returncode, 2, done.stderr)
         self.assertIn("ScriptedExperiment: 1 returned a result, 1 flaky\n", done.stdout)
-        self.assertIn("  Value       2        1  2     5.5       10  1  frames  -\n", done.stdout)
+        self.assertRegex(done.stdout, r"\n  Value       2        1  2     5\.5       10  1        2  \d{5,}  frames  -\n")
         self.assertEqual(done.stdout.count("\n  Measurement "), 2)
         self.assertNotIn("Repetition ", done.stdout)
         self.assertIn("2 runs: 1 returned a result, 0 ended in an error, 1 flaky\n", done.stdout)

@@ -4,6 +4,7 @@
 #include "host/command/explain_command.h"
 #include "host/command/output_check.h"
 #include "host/command/selection.h"
+#include "host/command/unknown_name.h"
 #include "host/plugin/diagnostic_registry.h"
 #include "host/record/value_json.h"
 #include "host/report/json_report.h"
@@ -47,6 +48,7 @@ ExitCode list(const Options& options, const Installation& installation, Console&
   std::vector<Diagnostic> catalogue;
   for (const DescribedDiagnostic& one : scan.catalogue) catalogue.push_back(one.diagnostic);
   std::vector<DescribedDiagnostic> listed;
+  if (!options.names.empty()) wantedWithWayOut(catalogue, options, installation, !scan.failed.empty());
   for (const Diagnostic& one : toList(catalogue, options, !scan.failed.empty())) {
     std::copy_if(scan.catalogue.begin(), scan.catalogue.end(), std::back_inserter(listed),
                  [&one](const DescribedDiagnostic& candidate) { return contains({one}, candidate.diagnostic); });
@@ -79,7 +81,14 @@ ExitCode describe(const Options& options, const Installation& installation, Cons
 
 ExitCode explainErrors(const Options& options, const Installation& installation, Console& console) {
   std::ostringstream text = textFor(options.report, console);
-  explain(options.names, installation.explanations(), options.report.format == Format::kJson, text);
+  try {
+    explain(options.names, installation.explanations(), options.report.format == Format::kJson, text);
+  } catch (const CommandError& refusal) {
+    if (refusal.code() == ExitCode::kUsage) {
+      for (const std::string& name : options.names) refusePhoneAsName(name, installation);
+    }
+    throw;
+  }
   writeOutput(options.report, console, text.str());
   return ExitCode::kAllPassed;
 }

@@ -84,5 +84,42 @@ class PhoneListTest(CommandLineTest):
         self.assertEqual(complete("phone", "probe", ""), [])
 
 
+class PhoneNamesTest(CommandLineTest):
+    def refuse(self, code, text, *arguments):
+        with self.subTest(arguments):
+            result = quazor(*arguments)
+            self.assert_refused(result, code)
+            self.assertEqual(result.stderr, f"quazor: {text}\n")
+
+    def test_a_phone_that_is_none(self):
+        run = ("run", "--all", "--phone")
+        self.refuse(66, "--phone camera_sync: this is a group of phones; to see them: quazor phone list 'camera_sync/*'",
+                    *run, "camera_sync")
+        self.refuse(66, "--phone nope: the file does not exist, and no installed phone has this name; 'quazor phone list' "
+                    "shows them", *run, "nope")
+        result = quazor(*run, "linux:nope")
+        self.assert_refused(result, 66, "--phone linux:nope: the file does not exist; the installed bindings are ")
+        self.assertNotIn("simulated", result.stderr)
+        broken = self.write("broken.json", "{")
+        self.assertNotIn("simulated", quazor(*run, f"linux:{broken}").stderr)
+
+    def test_a_phone_in_the_place_of_a_name(self):
+        for command in ("run", "describe", "list", "explain", "experiment"):
+            self.refuse(64, "'healthy' is a simulated phone; run diagnostics on it with 'quazor run --all --phone healthy'",
+                        command, "healthy")
+
+    def test_unknown_names_lead_to_the_list(self):
+        for what, name, command in (("diagnostic or experiment", "Camra", "list"), ("diagnostic or experiment", "Foo", "describe")):
+            self.refuse(64, f"there is no {what} '{name}'; 'quazor list' shows what is available", command, name)
+        self.refuse(64, "no diagnostic matches 'Foo*'; 'quazor list' shows what is available", "run", "Foo*")
+
+    def test_a_name_of_a_plug_in_that_is_loaded_only_when_named(self):
+        name = "NimbeImageExperiment"
+        for given, command in (("experiment", "experiment"), ("run", "experiment"), ("describe", "describe"), ("list", "list")):
+            self.refuse(64, f"{name} is an experiment of the plug-in sensor_images, which is loaded only when it is named; use "
+                        f"'quazor {command} {name} --plugin sensor_images'", given, name)
+        self.assertEqual(quazor("experiment", name, "--plugin", "sensor_images").returncode, 0)
+
+
 if __name__ == "__main__":
     unittest.main()

@@ -52,6 +52,18 @@ class FoundPluginsTest(PluginFoldersTest):
         verdicts = {one["name"]: one["verdict"] for one in json.loads(result.stdout)["diagnostics"]}
         self.assertEqual((verdicts[SHIPPED], verdicts["Fake.One"]), ("pass", "pass"))
 
+    def test_a_plug_in_for_which_the_memory_is_too_little_names_the_option(self):
+        result = self.quazor("list", "--memory", "1")
+        self.assertEqual(result.returncode, 66, result.stderr)
+        self.assertIn("failed to map segment from shared object; its process may use 1 MiB of memory; --memory raises that "
+                      "limit\n", result.stderr)
+
+    def test_a_plug_in_for_which_the_memory_is_too_little_names_the_option(self):
+        result = self.quazor("list", "--memory", "1")
+        self.assertEqual(result.returncode, 66, result.stderr)
+        self.assertIn("failed to map segment from shared object; its process may use 1 MiB of memory; --memory raises that "
+                      "limit\n", result.stderr)
+
     def test_folders_of_the_environment_hide_the_users_which_hide_the_installed(self):
         shutil.copy(WORKING, self.own / "mine.so")
         self.assertIn("Fake.One", self.listed())
@@ -69,8 +81,13 @@ class FoundPluginsTest(PluginFoldersTest):
                 self.assert_refused(self.quazor("list", path=path), 64, "QUAZOR_PLUGIN_PATH", why)
         missing = self.directory / "missing"
         self.assert_refused(self.quazor("list", path=str(missing)), 66, f"the folder '{missing}' does not exist")
-        self.assertIn(SHIPPED, self.listed(path=""))
         self.assertEqual(self.quazor("explain", "--format", "json", path="here").returncode, 0)
+
+    def test_an_empty_path_of_the_environment_is_none(self):
+        self.assertEqual(self.listed(path=""), self.listed())
+        without = self.quazor("doctor")
+        empty = self.quazor("doctor", path="")
+        self.assertEqual((empty.returncode, empty.stdout, empty.stderr), (0, without.stdout, ""))
 
     def test_what_is_no_plug_in_is_skipped(self):
         (self.own / "notes.txt").write_text("no plug-in")
@@ -89,12 +106,24 @@ class NamedPluginsTest(PluginFoldersTest):
         shutil.copy(PLUGINS / "moody_plugin.so", self.own)
         self.assertEqual(self.listed("--plugin", "moody_plugin"), ["Moody"])
 
-    def test_a_folder_of_that_name_is_no_plug_in(self):
-        (self.directory / "sensor_images").mkdir()
+    def test_a_folder_hides_no_installed_name(self):
+        for name in ("sensor_images", "strict", "healthy", "camera_sync/start_refused_on_first", "vivid", "unknown"):
+            (self.directory / name).mkdir(parents=True)
         before = os.getcwd()
         self.addCleanup(os.chdir, before)
         os.chdir(self.directory)
         self.assertEqual(self.listed("--plugin", "sensor_images"), ["NimbeImageExperiment"])
+        for option in ("--profile", "--parameters"):
+            result = self.quazor("run", SHIPPED, option, "strict", "--phone", "healthy")
+            self.assertEqual(result.returncode, 0, result.stderr)
+            self.assertIn("profile strict.json", result.stdout)
+        failed = self.quazor("run", SHIPPED, "--phone", "camera_sync/start_refused_on_first", "--format", "json")
+        self.assertEqual(failed.returncode, 2, failed.stderr)
+        self.assertEqual(self.quazor("selftest", "healthy", "--seeds", "1").returncode, 0)
+        absent = self.quazor("run", SHIPPED, "--phone", "linux:vivid")
+        self.assertNotIn("directory", absent.stderr)
+        for arguments in (("--profile", "unknown"), ("--phone", "unknown"), ("--phone", "linux:unknown")):
+            self.assert_refused(self.quazor("run", SHIPPED, *arguments), 66, "unknown: this is a directory, not a file")
 
     def test_an_unknown_name_is_told_what_there_is(self):
         shutil.copy(WORKING, self.own)

@@ -1,6 +1,8 @@
 #include "host/command/commands.h"
 
+#include "base/text/nearest_name.h"
 #include "contract/contract.h"
+#include "contract/message_format.h"
 #include "host/command/conductor.h"
 #include "host/command/explanations.h"
 #include "host/command/failed_only.h"
@@ -172,6 +174,27 @@ DiagnosticErrorPtr missingParameter(const ResolvedDiagnostic& one, const Options
   return hostError(HostErrorCode::kParameterMissing, problem);
 }
 
+// A phone of a run must be a file, or the name of one that is installed.
+void requirePhone(const std::filesystem::path& file, const Options& options, const Installation& installation) {
+  std::error_code ignored;
+  if (std::filesystem::exists(std::filesystem::symlink_status(file, ignored)) || file.is_absolute()) return;
+  const std::string text = "--phone " + options.phone.string() + ": ";
+  if (bindingNamed(options.phone)) {
+    throw CommandError(ExitCode::kCannotRead,
+                       text + "the file does not exist" +
+                           didYouMeanOf(file.string(), "the installed bindings", installation.bindingNames()));
+  }
+  const std::string group = file.string() + "/";
+  for (const std::string& name : installation.scenarioNames()) {
+    if (!name.starts_with(group)) continue;
+    throw CommandError(ExitCode::kCannotRead,
+                       formatMessage("%@this is a group of phones; to see them: quazor phone list '%@*'", text, group));
+  }
+  throw CommandError(ExitCode::kCannotRead, text +
+                                                "the file does not exist, and no installed phone has this name; "
+                                                "'quazor phone list' shows them");
+}
+
 // The selected phone.
 struct ChosenPhone {
   std::string name;  // as records have it
@@ -182,11 +205,13 @@ struct ChosenPhone {
 ChosenPhone choosePhone(const Options& options, const Installation& installation) {
   if (const auto binding = bindingNamed(options.phone)) {
     const std::filesystem::path file = installation.binding(*binding);
+    requirePhone(file, options, installation);
     const auto make = [phones = phonesOfBinding(file)](std::uint64_t /*seed*/) { return phones; };
     return {std::string(kLinuxPrefix) + file.string(), make, absentOnBinding(file)};
   }
   const std::filesystem::path scenario =
       options.phone.empty() ? installation.defaultScenario() : installation.scenario(options.phone);
+  requirePhone(scenario, options, installation);
   const ScenarioSource source = installation.scenarioSource();
   return {scenario.string(), seededPhonesOfScenario(scenario, options.realTime, source),
           absentOnScenario(scenario, source)};

@@ -2,6 +2,7 @@
 
 #include "base/text/nearest_name.h"
 #include "host/command/explanations.h"
+#include "host/command/unknown_name.h"
 #include "host/plugin/plugin_loader.h"
 #include "host/plugin/plugin_trust.h"
 #include "host/plugin/profile.h"
@@ -117,6 +118,16 @@ std::vector<Diagnostic> wantedOf(const std::vector<Diagnostic>& catalogue, const
   return selected;
 }
 
+std::vector<Diagnostic> wantedWithWayOut(const std::vector<Diagnostic>& catalogue, const Options& options,
+                                         const Installation& installation, bool mayBeNone) {
+  try {
+    return wantedOf(catalogue, options, mayBeNone);
+  } catch (const CommandError& refusal) {
+    refuseUnknownName(catalogue, options, installation, refusal);
+    throw;
+  }
+}
+
 std::vector<std::filesystem::path> recordedPlugins(const std::vector<std::string>& recorded,
                                                    const Installation& installation) {
   const std::vector<std::filesystem::path> installed = installation.allPlugins();
@@ -177,7 +188,7 @@ Selection select(const Options& options, const Installation& installation, Watch
   catalogue.reserve(described.size());
   for (const DescribedDiagnostic& one : described) catalogue.push_back(one.diagnostic);
 
-  const std::vector<Diagnostic> wanted = wantedOf(catalogue, options, !scan.failed.empty());
+  const std::vector<Diagnostic> wanted = wantedWithWayOut(catalogue, options, installation, !scan.failed.empty());
   std::vector<Profile> profiles = profilesOf(options, installation);
   describeForProfiles(options, installation, profiles, described, signals);
   addExplainedRanges(installation.explanations(), described);

@@ -33,6 +33,10 @@ std::vector<std::filesystem::path> recordedPlugins(const std::vector<std::string
 // for a name or a pattern that fits nothing, unless `mayBeNone`.
 std::vector<Diagnostic> wantedOf(const std::vector<Diagnostic>& catalogue, const Options& options, bool mayBeNone);
 
+// Like wantedOf(), but throws like refuseUnknownName() for a name that fits nothing in the catalogue.
+std::vector<Diagnostic> wantedWithWayOut(const std::vector<Diagnostic>& catalogue, const Options& options,
+                                         const Installation& installation, bool mayBeNone);
+
 // Scans the plug-ins in separate processes, or in this one with --in-process. `described` chooses the diagnostics that
 // are asked for their descriptions. Throws like scanPlugins() and Installation::allPlugins(), and kInterrupted on an
 // interrupt. In this process, a plug-in that is refused always is a CommandError: its code could not be removed.

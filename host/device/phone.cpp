@@ -54,13 +54,15 @@ class PhoneOfBinding final : public Phone {
   LinuxPhone phone_;
 };
 
+constexpr const char* kOfBinding = "the phone of the binding";
+
 // Reads the file with `readIt` and adds to an InputError what cannot be created.
 template <class Read>
-auto read(Read&& readIt, const std::filesystem::path& file) {
+auto read(Read&& readIt, const std::filesystem::path& file, const char* what = "the simulated phone") {
   try {
     return readIt(file);
   } catch (const InputError& problem) {
-    throw InputError(std::string("the simulated phone cannot be created: ") + problem.what());
+    throw InputError(std::string(what) + " cannot be created: " + problem.what());
   }
 }
 
@@ -112,7 +114,8 @@ std::optional<std::filesystem::path> bindingNamed(const std::filesystem::path& p
 }
 
 PhoneMaker phonesOfBinding(const std::filesystem::path& file) {
-  return [binding = read(readBindingFile, file).binding] { return std::make_unique<PhoneOfBinding>(binding); };
+  return
+      [binding = read(readBindingFile, file, kOfBinding).binding] { return std::make_unique<PhoneOfBinding>(binding); };
 }
 
 std::vector<SkipRule> absentOnScenario(const std::filesystem::path& file, const ScenarioSource& find) {
@@ -120,7 +123,9 @@ std::vector<SkipRule> absentOnScenario(const std::filesystem::path& file, const 
   return read(readIt, file).absent;
 }
 
-std::vector<SkipRule> absentOnBinding(const std::filesystem::path& file) { return read(readBindingFile, file).absent; }
+std::vector<SkipRule> absentOnBinding(const std::filesystem::path& file) {
+  return read(readBindingFile, file, kOfBinding).absent;
+}
 
 PhoneProbe probeThisMachine() {
   MachineProbe probe = probeMachine(sourcesOfRunningSystem());

@@ -18,6 +18,7 @@ namespace {
 struct RepeatedValue {
   double value = 0;
   std::uint64_t repetition = 0;
+  std::uint64_t seed = 0;
 };
 
 // All values of one result.
@@ -57,7 +58,7 @@ class SeriesOfDiagnostic {
     const auto [place, isNew] = places_.emplace(Key{name, seen[name]++, unit}, series_.size());
     if (isNew) series_.push_back({name, unit, {}, std::nullopt, {}});
     Series& series = series_[place->second];
-    series.values.push_back({measurement.value(), record.trial.repetition});
+    series.values.push_back({measurement.value(), record.trial.repetition, record.seed});
     return series;
   }
 
@@ -72,14 +73,37 @@ bool varies(const Series& series) {
                      [&series](const RepeatedValue& one) { return !isSame(one.value, series.values.front().value); });
 }
 
-VaryingResult summaryOf(const Series& series) {
-  constexpr double kNone = std::numeric_limits<double>::quiet_NaN();
-  VaryingResult result{series.name, series.unit,  series.values.size(), kNone, kNone, kNone, 0,
-                       0,           series.limit, series.userLimits};
+// The most frequent value, the first one of several, if at least half of the values are that.
+std::optional<double> frequentValueOf(const std::vector<RepeatedValue>& values) {
+  const auto isLess = [](double one, double other) {  // a value that is not a number is greatest
+    return std::isnan(one) || std::isnan(other) ? !std::isnan(one) : one < other;
+  };
+  std::map<double, std::size_t, decltype(isLess)> counts(isLess);
+  std::size_t most = 0;
+  for (const RepeatedValue& one : values) most = std::max(most, ++counts[one.value]);
+  if (most * 2 < values.size()) return std::nullopt;
+  return std::find_if(values.begin(), values.end(), [&](const RepeatedValue& one) { return counts[one.value] == most; })
+      ->value;
+}
+
+const RepeatedValue& outlierOf(const std::vector<RepeatedValue>& values, double median) {
+  const double usual = frequentValueOf(values).value_or(median);
+  const auto distanceOf = [usual](const RepeatedValue& one) {
+    if (isSame(one.value, usual)) return 0.0;
+    return std::isfinite(one.value) && std::isfinite(usual) ? std::abs(one.value / 2 - usual / 2)  // cannot overflow
+                                                            : std::numeric_limits<double>::infinity();
+  };
+  return *std::max_element(values.begin(), values.end(), [&](const RepeatedValue& one, const RepeatedValue& other) {
+    return distanceOf(one) < distanceOf(other);
+  });
+}
+
+// Of the finite values; there may be none.
+void summarizeFinite(const std::vector<RepeatedValue>& values, VaryingResult& result) {
   std::vector<RepeatedValue> finite;
-  std::copy_if(series.values.begin(), series.values.end(), std::back_inserter(finite),
+  std::copy_if(values.begin(), values.end(), std::back_inserter(finite),
                [](const RepeatedValue& one) { return std::isfinite(one.value); });
-  if (finite.empty()) return result;
+  if (finite.empty()) return;
   std::stable_sort(finite.begin(), finite.end(),
                    [](const RepeatedValue& a, const RepeatedValue& b) { return a.value < b.value; });
   const std::size_t middle = finite.size() / 2;
@@ -92,6 +116,16 @@ VaryingResult summaryOf(const Series& series) {
   result.maximumRepetition = first->repetition;
   // The sum of two values may overflow.
   result.median = isOdd ? finite[middle].value : finite[middle - 1].value / 2 + finite[middle].value / 2;
+}
+
+VaryingResult summaryOf(const Series& series) {
+  constexpr double kNone = std::numeric_limits<double>::quiet_NaN();
+  VaryingResult result{series.name, series.unit,  series.values.size(), kNone, kNone, kNone, 0, 0, 0,
+                       0,           series.limit, series.userLimits};
+  summarizeFinite(series.values, result);
+  const RepeatedValue& outlier = outlierOf(series.values, result.median);
+  result.outlierRepetition = outlier.repetition;
+  result.outlierSeed = outlier.seed;
   return result;
 }
 

@@ -31,6 +31,7 @@ VaryingResult varyingOf(const std::vector<double>& numbers) {
   std::vector<DiagnosticRecord> records;
   for (const double number : numbers) {
     records.push_back(entry("A", Verdict::kPass, {0, 0, records.size() + 1, numbers.size()}, {value("R", number)}));
+    records.back().seed = 100 + records.size();
   }
   const std::vector<DiagnosticVariation> variations = variationOf(records);
   return variations.at(0).varying.empty() ? VaryingResult() : variations[0].varying[0];
@@ -71,6 +72,27 @@ TEST(Variation, HasTheFirstRepetitionsOfMinimumAndMaximum) {
   EXPECT_EQ(varyingOf({7, 7, 6}).minimumRepetition, 3U);
   EXPECT_EQ(varyingOf({7, 7, 6}).maximumRepetition, 1U);
   EXPECT_EQ(varyingOf({std::nan(""), HUGE_VAL}).minimumRepetition, 0U);
+}
+
+TEST(Variation, HasTheFirstRepetitionThatIsFarthestFromTheUsualValue) {
+  const double nan = std::nan("");
+  constexpr double kMost = std::numeric_limits<double>::max();
+  const std::pair<std::vector<double>, std::uint64_t> cases[] = {
+      {{90, 90, 87, 90}, 3},      // from the most frequent value
+      {{90, 90, 87, 70, 87}, 4},  // from the median
+      {{10, 1}, 2},               // of two values, the first is the usual one
+      {{2, 1, 9, 9}, 2},          // half of the values are enough
+      {{1.5, 1.6, 1.4, 1.9}, 4},
+      {{5, 5, 4, 6}, 3},  // the first of two
+      {{1, 2, nan, 50, HUGE_VAL}, 3},
+      {{nan, nan, 7}, 3},
+      {{-kMost, kMost, kMost / 2}, 1}};
+  for (const auto& [values, repetition] : cases) {
+    SCOPED_TRACE(testing::PrintToString(values));
+    const VaryingResult some = varyingOf(values);
+    EXPECT_EQ(some.outlierRepetition, repetition);
+    EXPECT_EQ(some.outlierSeed, 100 + repetition);
+  }
 }
 
 TEST(Variation, LeavesOutValuesThatAreNotFinite) {

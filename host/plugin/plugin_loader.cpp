@@ -8,6 +8,7 @@
 #include "host/plugin/shared_object.h"
 
 #include <dlfcn.h>
+#include <sys/resource.h>
 
 #include <algorithm>
 #include <charconv>
@@ -19,9 +20,21 @@ namespace quazor {
 
 namespace {
 
+// The way out if a file could not be mapped in a process whose memory is limited.
+std::string memoryHint(const std::string& message) {
+  rlimit limit{};
+  const bool isForMemory = message.find("failed to map segment") != std::string::npos ||
+                           message.find("annot allocate memory") != std::string::npos;
+  if (!isForMemory || ::getrlimit(RLIMIT_AS, &limit) != 0 || limit.rlim_cur == RLIM_INFINITY) return {};
+  return "; its process may use " + std::to_string(limit.rlim_cur >> 20U) +
+         " MiB of memory; --memory raises that limit";
+}
+
 [[noreturn]] void refuseUnlinkable(const std::string& message) {
   const std::optional<int> version = contractVersionIn(message);
-  if (!version || *version == QUAZOR_CONTRACT_VERSION) throw InputError("cannot be loaded: " + message);
+  if (!version || *version == QUAZOR_CONTRACT_VERSION) {
+    throw InputError("cannot be loaded: " + message + memoryHint(message));
+  }
   throw InputError("was built against version " + std::to_string(*version) +
                    " of the plug-in contract, but this program has version " + std::to_string(QUAZOR_CONTRACT_VERSION) +
                    "; rebuild the plug-in against this version");

@@ -58,10 +58,11 @@ Row rowOf(const DiagnosticRecord& record) {
   return row;
 }
 
-// Calls `visit` for each row.
+// Calls `visitRow` for each row, with the record that it is of.
 template <class Visit>
-void visitRows(const std::vector<DiagnosticRecord>& records, Visit&& visit) {
+void visitRows(const std::vector<DiagnosticRecord>& records, Visit&& visitRow) {
   for (const DiagnosticRecord& record : records) {
+    const auto visit = [&](const Row& one) { visitRow(one, record); };
     Row row = rowOf(record);
     std::size_t number = 0;
     for (const auto& [ignored, value] : record.auxiliaryData) {
@@ -170,9 +171,9 @@ std::string csvField(std::string_view text) {
   return field + "\"";
 }
 
-std::string experimentCsv(const std::vector<DiagnosticRecord>& records) {
+std::string experimentCsv(const std::vector<DiagnosticRecord>& records, std::vector<std::uint64_t>* seeds) {
   std::set<Column> columns;
-  visitRows(records, [&columns](const Row& row) {
+  visitRows(records, [&columns](const Row& row, const DiagnosticRecord& /*record*/) {
     for (const auto& [column, ignored] : row) columns.insert(column);
   });
   if (columns.empty()) columns = {experimentColumn(), measurementColumn(), valueColumn(), unitColumn()};
@@ -183,7 +184,8 @@ std::string experimentCsv(const std::vector<DiagnosticRecord>& records) {
   appendLine(csv, {header.begin(), header.end()});
   std::vector<std::string_view> fields;
   fields.reserve(columns.size());
-  visitRows(records, [&](const Row& row) {
+  visitRows(records, [&](const Row& row, const DiagnosticRecord& record) {
+    if (seeds != nullptr) seeds->push_back(record.seed);
     fields.clear();
     for (const Column& column : columns) {
       const auto cell = row.find(column);
@@ -194,7 +196,7 @@ std::string experimentCsv(const std::vector<DiagnosticRecord>& records) {
   return csv;
 }
 
-std::string diagnosticCsv(const std::vector<DiagnosticRecord>& records) {
+std::string diagnosticCsv(const std::vector<DiagnosticRecord>& records, std::vector<std::uint64_t>* seeds) {
   std::string csv;
   std::vector<std::string_view> columns = kDiagnosticColumns;
   const bool withSkips = hasSkips(records);
@@ -209,13 +211,17 @@ std::string diagnosticCsv(const std::vector<DiagnosticRecord>& records) {
     if (record.skip) more = {std::string(nameOf(record.skip->kind)), textCell(record.skip->reason)};
     if (withAttempts) more.push_back(countCell(record.trial.attempt));
     if (withRepetitions) more.push_back(countCell(record.trial.repetition));
+    const auto append = [&](const std::vector<std::string>& ofResult) {
+      appendDiagnosticLine(csv, record, ofResult, more);
+      if (seeds != nullptr) seeds->push_back(record.seed);
+    };
     const std::vector<LimitCheck> checks = limitChecksOf(record);
     for (std::size_t i = 0; i < record.measuredResults.size(); ++i) {
       const auto& [result, verdict, ignored] = record.measuredResults[i];
-      appendDiagnosticLine(csv, record, cellsOf(result, result.limit(), nameOf(verdict)), more);
-      for (const LimitCheck& check : checksOfResult(checks, i)) appendDiagnosticLine(csv, record, cellsOf(check), more);
+      append(cellsOf(result, result.limit(), nameOf(verdict)));
+      for (const LimitCheck& check : checksOfResult(checks, i)) append(cellsOf(check));
     }
-    if (record.measuredResults.empty()) appendDiagnosticLine(csv, record, {}, more);
+    if (record.measuredResults.empty()) append({});
   }
   return csv;
 }

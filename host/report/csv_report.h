@@ -3,6 +3,7 @@
 
 #include "host/model/diagnostic_record.h"
 
+#include <cstdint>
 #include <string>
 #include <string_view>
 #include <vector>
@@ -16,10 +17,11 @@ std::string textCell(std::string_view text);
 // doubled.
 std::string csvField(std::string_view text);
 
-// A header line, then one line per sample of each image and one per measurement, in the order of the records.
-std::string experimentCsv(const std::vector<DiagnosticRecord>& records);
+// A header line, then one line per sample of each image and one per measurement, in the order of the records. Adds the
+// seed of the record of each line after the header to `seeds`, unless that is null.
+std::string experimentCsv(const std::vector<DiagnosticRecord>& records, std::vector<std::uint64_t>* seeds = nullptr);
 
-// A header line, then one line per measured result. A diagnostic without results has one line.
-std::string diagnosticCsv(const std::vector<DiagnosticRecord>& records);
+// A header line, then one line per measured result. A diagnostic without results has one line. `seeds` as above.
+std::string diagnosticCsv(const std::vector<DiagnosticRecord>& records, std::vector<std::uint64_t>* seeds = nullptr);
 
 }  // namespace quazor

@@ -113,7 +113,11 @@ std::string reportText(Format format, const RunStarted& run, const std::vector<D
                        const std::optional<std::string>& interrupted, const TextContent& text) {
   switch (format) {
     case Format::kText: return textReport(run, records, interrupted, text);
-    case Format::kCsv: return withRunColumns(run.ofExperiments ? experimentCsv(records) : diagnosticCsv(records), run);
+    case Format::kCsv: {
+      std::vector<std::uint64_t> seeds;
+      const std::string csv = run.ofExperiments ? experimentCsv(records, &seeds) : diagnosticCsv(records, &seeds);
+      return withRunColumns(csv, run, seeds);
+    }
     case Format::kOcp: return ocpReport(run, records, interrupted);
     case Format::kJunit: return junitReport(run, records, interrupted);
     case Format::kJson: break;

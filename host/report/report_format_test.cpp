@@ -115,7 +115,7 @@ TEST_F(ReportTextTest, SaysWhichRunItWasInEveryFormatForPrograms) {
               HasSubstr(",errorMessage,run,date,host,program,contract,plugins,phone,seed,tag.serial,tag.station\n"));
   EXPECT_THAT(csv, HasSubstr(",0af3," + timestampText(run_.date) + ",bench 7," + run_.program + "," +
                              std::to_string(run_.contract) + ",\"a.so; b,c.so\"," + run_.phone +
-                             ",5,C02X,\"line \"\"3\"\"\"\n"));
+                             ",7,C02X,\"line \"\"3\"\"\"\n"));
   records_[0].error = errorWithMessage("D", 1, "two\nlines", nullptr);
   EXPECT_THAT(report(Format::kCsv), HasSubstr("\"two\nlines\",0af3,"));
   const std::string xml = report(Format::kJunit);

@@ -12,6 +12,9 @@ using Json = nlohmann::ordered_json;
 
 namespace {
 
+constexpr std::string_view kSeedColumn = "seed";
+
+// The cell of the seed is left to the line.
 std::vector<std::pair<std::string, std::string>> columnsOf(const RunStarted& run) {
   std::string plugins;
   std::string_view separator;
@@ -27,7 +30,7 @@ std::vector<std::pair<std::string, std::string>> columnsOf(const RunStarted& run
                                                               {"contract", std::to_string(run.contract)},
                                                               {"plugins", textCell(plugins)},
                                                               {"phone", textCell(run.phone)},
-                                                              {"seed", std::to_string(run.seed)}};
+                                                              {std::string(kSeedColumn), {}}};
   for (const auto& [key, value] : run.tags) columns.emplace_back("tag." + key, textCell(value));
   return columns;
 }
@@ -52,19 +55,31 @@ Json runJson(const RunStarted& run) {
   return json;
 }
 
-std::string withRunColumns(const std::string& csv, const RunStarted& run) {
+std::string withRunColumns(const std::string& csv, const RunStarted& run, const std::vector<std::uint64_t>& seeds) {
   std::string header;
-  std::string cells;
+  std::string beforeSeed;
+  std::string afterSeed;
+  bool isAfter = false;
   for (const auto& [name, value] : columnsOf(run)) {
     header += "," + csvField(name);
-    cells += "," + csvField(value);
+    (isAfter ? afterSeed : beforeSeed) += "," + csvField(value);
+    if (name == kSeedColumn) isAfter = true;
   }
   std::string table;
   bool quoted = false;
-  const std::string* addition = &header;
+  bool isHeader = true;
+  auto seed = seeds.begin();
   for (const char unit : csv) {
     if (unit == '"') quoted = !quoted;
-    if (unit == '\n' && !quoted) table += *std::exchange(addition, &cells);
+    if (unit == '\n' && !quoted) {
+      if (std::exchange(isHeader, false)) {
+        table += header;
+      } else {
+        table += beforeSeed;
+        table += std::to_string(*seed++);
+        table += afterSeed;
+      }
+    }
     table += unit;
   }
   return table;

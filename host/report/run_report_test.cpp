@@ -146,7 +146,7 @@ TEST_F(ExperimentReportTest, WritesTheDocumentOfExperiments) {
 
 // The first line of a table of measurements, and the end of every other line, with the run.
 const std::string kHeader = "experiment,measurement,value,unit,run,date,host,program,contract,plugins,phone,seed\n";
-const std::string kRun = ",,2026-11-21T01:08:00.000000000Z,,0.1.0,2,p.so,phone.json,5\n";
+const std::string kRun = ",,2026-11-21T01:08:00.000000000Z,,0.1.0,2,p.so,phone.json,7\n";
 
 TEST_F(ExperimentReportTest, WritesOneTableAndTellsErrorsBesideIt) {
   RunReport report({Format::kCsv, {}}, console_);

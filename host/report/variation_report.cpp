@@ -54,13 +54,14 @@ std::string repetitionText(std::uint64_t repetition) { return repetition == 0 ? 
 void printVarying(std::ostream& out, const std::vector<VaryingResult>& results) {
   using Align = Table::Align;
   Table table({Align::kLeft, Align::kRight, Align::kRight, Align::kRight, Align::kRight, Align::kRight, Align::kRight,
-               Align::kLeft, Align::kLeft});
-  table.addHeader({"Result", "Count", "Minimum", "#", "Median", "Maximum", "#", "Unit", "Limit"});
+               Align::kRight, Align::kRight, Align::kLeft, Align::kLeft});
+  table.addHeader({"Result", "Count", "Minimum", "#", "Median", "Maximum", "#", "Outlier", "Seed", "Unit", "Limit"});
   for (const VaryingResult& one : results) {
     const auto addRow = [&table, &one](const std::string& limit) {
       table.addRow({printable(one.name), std::to_string(one.values), defaultText(one.minimum),
                     repetitionText(one.minimumRepetition), defaultText(one.median), defaultText(one.maximum),
-                    repetitionText(one.maximumRepetition), printable(one.unit), limit});
+                    repetitionText(one.maximumRepetition), std::to_string(one.outlierRepetition),
+                    std::to_string(one.outlierSeed), printable(one.unit), limit});
     };
     addRow(limitText(one.limit));
     for (const UserLimit& limit : one.userLimits) addRow(printable(labelOf(limit)));
@@ -103,7 +104,9 @@ void printVariation(std::ostream& out, const std::vector<DiagnosticRecord>& reco
   const bool isAnyVarying = std::any_of(variations.begin(), variations.end(),
                                         [](const DiagnosticVariation& one) { return !one.varying.empty(); });
   out << "What varied between the repetitions"
-      << (isAnyVarying ? " (#: the first repetition with that value):\n" : ":\n");
+      << (isAnyVarying ? " (#: the first repetition with that value; Outlier: the one that differs most, "
+                         "and its seed):\n"
+                       : ":\n");
   for (const DiagnosticVariation& one : variations) {
     out << printable(one.name) << ": " << countsText(one.verdicts, ofExperiments) << '\n';
     if (!one.varying.empty()) printVarying(out, one.varying);
@@ -129,6 +132,8 @@ Json variationJson(const std::vector<DiagnosticRecord>& records) {
                          {"maximum", numberJson(result.maximum)},
                          {"minimumRepetition", repetitionJson(result.minimumRepetition)},
                          {"maximumRepetition", repetitionJson(result.maximumRepetition)},
+                         {"outlierRepetition", result.outlierRepetition},
+                         {"outlierSeed", result.outlierSeed},
                          {"limit", limitJson(result.limit)}});
       for (const UserLimit& limit : result.userLimits) varying.back()["userLimits"].push_back(userLimitJson(limit));
     }

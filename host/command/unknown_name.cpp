@@ -1,0 +1,77 @@
+#include "host/command/unknown_name.h"
+
+#include "contract/message_format.h"
+#include "host/command/selection.h"
+#include "host/error/exit_code.h"
+#include "host/run/plugin_scan.h"
+#include "host/system/child_process.h"
+
+#include <algorithm>
+#include <iterator>
+
+namespace quazor {
+
+namespace {
+
+bool fits(const std::string& name, const Diagnostic& one) { return matchesName(name, one.name); }
+
+// What the plug-ins have that are loaded only when they are named.
+std::vector<DescribedDiagnostic> loadedOnlyWhenNamed(const Options& options, const Installation& installation) {
+  IsolationOptions isolation = isolationOf(options, installation);
+  const std::vector<std::filesystem::path> byDefault = isolation.plugins;
+  isolation.plugins = installation.allPlugins();
+  isolation.unasked = true;
+  std::erase_if(isolation.plugins, [&byDefault](const std::filesystem::path& one) {
+    return std::find(byDefault.begin(), byDefault.end(), one) != byDefault.end();
+  });
+  if (isolation.plugins.empty()) return {};
+  WatchedSignals signals;
+  return scanPlugins(isolation, signals, [](const std::vector<Diagnostic>&) { return std::vector<Diagnostic>(); })
+      .catalogue;
+}
+
+void refuseNameOfUnloaded(const std::string& name, const Options& options, const Installation& installation) {
+  // With --in-process, plug-ins may have started threads, so that no process can be made.
+  if (!options.plugins.empty() || options.inProcess) return;
+  for (const DescribedDiagnostic& described : loadedOnlyWhenNamed(options, installation)) {
+    const Diagnostic& one = described.diagnostic;
+    if (!fits(name, one) || one.plugins.empty()) continue;
+    const bool runs = options.command == Command::kRun || options.command == Command::kExperiment;
+    const std::string_view command =
+        runs ? (one.experimentOnly ? "experiment" : "run") : kCommandNames[static_cast<std::size_t>(options.command)];
+    const std::string plugin = one.plugins.front().stem().string();
+    throw CommandError(
+        ExitCode::kUsage,
+        formatMessage("%@ is %@ of the plug-in %@, which is loaded only when it is named; use 'quazor %@ "
+                      "%@ --plugin %@'",
+                      one.name, one.experimentOnly ? "an experiment" : "a diagnostic", plugin, command, one.name,
+                      plugin));
+  }
+}
+
+}  // namespace
+
+void refusePhoneAsName(const std::string& name, const Installation& installation) {
+  const std::vector<std::string> phones = installation.scenarioNames();
+  if (std::find(phones.begin(), phones.end(), name) == phones.end()) return;
+  throw CommandError(ExitCode::kUsage,
+                     formatMessage("'%@' is a simulated phone; run diagnostics on it with 'quazor run "
+                                   "--all --phone %@'",
+                                   name, name));
+}
+
+void refuseUnknownName(const std::vector<Diagnostic>& catalogue, const Options& options,
+                       const Installation& installation, const CommandError& refusal) {
+  const auto name = std::find_if(options.names.begin(), options.names.end(), [&catalogue](const std::string& one) {
+    return std::none_of(catalogue.begin(), catalogue.end(),
+                        [&one](const Diagnostic& other) { return fits(one, other); });
+  });
+  if (name == options.names.end()) return;
+  refuseNameOfUnloaded(*name, options, installation);
+  refusePhoneAsName(*name, installation);
+  const std::string text = refusal.what();
+  if (text.ends_with("?")) return;  // it has a suggestion
+  throw CommandError(ExitCode::kUsage, text + "; 'quazor list' shows what is available");
+}
+
+}  // namespace quazor

@@ -1,0 +1,21 @@
+// The way out for a name that fits nothing that is loaded.
+#pragma once
+
+#include "host/cli/command_line.h"
+#include "host/cli/installation.h"
+#include "host/plugin/diagnostic_registry.h"
+
+#include <string>
+#include <vector>
+
+namespace quazor {
+
+// Throws a CommandError (kUsage) if it is the name of an installed phone.
+void refusePhoneAsName(const std::string& name, const Installation& installation);
+
+// Throws the refusal of the first name of the options that fits nothing in the catalogue, with the way out: the plug-in
+// that must be named, that it is a phone, or the command that lists all names. Returns if there is no such name.
+void refuseUnknownName(const std::vector<Diagnostic>& catalogue, const Options& options,
+                       const Installation& installation, const CommandError& refusal);
+
+}  // namespace quazor
