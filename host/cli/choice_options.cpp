@@ -88,7 +88,7 @@ void addTrace(CLI::App& command, std::string& text) {
 Choice choiceOf(const ChoiceTexts& texts) {
   Choice choice;
   choice.except = texts.except;
-  if (!texts.settle.empty()) choice.settle = parseSettle(texts.settle);
+  if (!texts.settle.empty()) choice.settle = parseTime("--settle", texts.settle);
   for (const std::string& text : texts.skips) choice.skips.push_back(parseSkip(text));
   if (!texts.stopOn.empty()) choice.stopOn = texts.stopOn == "fail" ? StopOn::kFail : StopOn::kError;
   choice.allowSkips = texts.allowSkips;

@@ -1,10 +1,10 @@
 #include "host/cli/command_line.h"
 
-#include "base/text/nearest_name.h"
 #include "contract/contract.h"
 #include "host/cli/help_texts.h"
 #include "host/cli/option_checks.h"
 #include "host/cli/option_values.h"
+#include "host/cli/timeline_options.h"
 #include "host/device/phone.h"
 #include "host/text/table.h"
 #include "host/text/terminal.h"
@@ -48,6 +48,7 @@ struct RawOptions {
   std::string trace = "frames";
   std::string format = "text";
   ChoiceTexts choice;
+  TimelineTexts timeline;
   bool all = false;
   bool replace = false;
   bool realTime = false;
@@ -93,9 +94,9 @@ void removeMarks(RawOptions& raw) {
         &raw.outputs, &raw.deadlines, &raw.choice.except, &raw.choice.skips}) {
     std::for_each(texts->begin(), texts->end(), removeMark);
   }
-  for (std::string* text :
-       {&raw.profile, &raw.phone, &raw.record, &raw.of, &raw.seed, &raw.seeds, &raw.memory, &raw.logLimit, &raw.trace,
-        &raw.grace, &raw.choice.settle, &raw.choice.attempts, &raw.choice.repetitions}) {
+  for (std::string* text : {&raw.profile, &raw.phone, &raw.record, &raw.of, &raw.seed, &raw.seeds, &raw.memory,
+                            &raw.logLimit, &raw.trace, &raw.grace, &raw.choice.settle, &raw.choice.attempts,
+                            &raw.choice.repetitions, &raw.timeline.from, &raw.timeline.to}) {
     removeMark(*text);
   }
 }
@@ -107,17 +108,19 @@ void addPlugins(CLI::App& command, RawOptions& raw) {
                 "FILE|NAME");
 }
 
+void addOutput(CLI::App& command, RawOptions& raw) {
+  addRepeatable(command, "--output", raw.outputs, "Write the report to this file", "FILE");
+}
+
 void addReportOptions(CLI::App& command, RawOptions& raw, const std::vector<std::string>& formats) {
   std::string list;
   for (const std::string& format : formats) list += (list.empty() ? "" : ", ") + format;
   command.add_option("--format", raw.format, "Report format: " + list)
       ->type_name("FORMAT")
       ->check(CLI::IsMember(formats));
-  const bool several = formats.size() > 2;
+  if (formats.size() <= 2) return addOutput(command, raw);
   addRepeatable(command, "--output", raw.outputs,
-                several ? "Write the report to this file. FORMAT:FILE writes an additional report; repeatable"
-                        : "Write the report to this file",
-                several ? "[FORMAT:]FILE" : "FILE");
+                "Write the report to this file. FORMAT:FILE writes an additional report; repeatable", "[FORMAT:]FILE");
 }
 
 void addProcessOptions(CLI::App& command, RawOptions& raw) {
@@ -266,9 +269,10 @@ std::vector<std::string> namesOfPhoneCommand(const CLI::App& command, const RawO
 }
 
 Options optionsOf(const CLI::App& command, const RawOptions& raw) {
-  for (const char* option : {"--plugin", "--output", "--profile", "--parameters", "--phone", "--record", "--of",
-                             "RECORD", "--memory", "--log-limit", "--trace", "--grace", "--heartbeat", "--settle",
-                             "--except", "--skip", "--attempts", "--repeat"}) {
+  for (const char* option :
+       {"--plugin", "--output", "--profile",   "--parameters", "--phone", "--record",    "--of",
+        "RECORD",   "--memory", "--log-limit", "--trace",      "--grace", "--heartbeat", "--settle",
+        "--except", "--skip",   "--attempts",  "--repeat",     "--from",  "--to"}) {
     refuseEmpty(command, option);
   }
   Options options;
@@ -288,6 +292,7 @@ Options optionsOf(const CLI::App& command, const RawOptions& raw) {
   checkPhone(command, options.phone);
   options.realTime = raw.realTime;
   options.choice = choiceOf(raw.choice);
+  options.part = timelinePartOf(raw.timeline);
   options.inProcess = raw.inProcess;
   options.seed = parseWhole("--seed", raw.seed, 0, UINT64_MAX);
   if (const CLI::Option* const seed = command.get_option_no_throw("--seed")) options.hasSeed = seed->count() > 0;
@@ -304,6 +309,7 @@ Options optionsOf(const CLI::App& command, const RawOptions& raw) {
   options.systemLog = raw.systemLog;
   if (command.get_option_no_throw("--tag") != nullptr) options.tags = tagsOf(raw.tags);
   options.report = reportOf(raw, writesSeveralFormats(options.command));
+  if (options.command == Command::kReport) options.report.format = Format::kJson;
   options.report.exitRules.allowSkips = options.choice.allowSkips;
   options.report.text.verbose = raw.verbose;
   options.report.shownLog = options.logLevel.value_or(LogLevel::kError);
@@ -312,17 +318,6 @@ Options optionsOf(const CLI::App& command, const RawOptions& raw) {
   if (options.command == Command::kRun) checkNames(options, "diagnostics");
   if (options.command == Command::kExperiment) checkNames(options, "experiments");
   return options;
-}
-
-std::vector<std::string> commandNames() { return {std::begin(kCommandNames), std::end(kCommandNames)}; }
-
-// Reports an unknown command with a suggestion, which CLI11 does not do.
-void refuseUnknownCommand(const std::vector<std::string>& arguments) {
-  if (arguments.empty() || arguments.front().starts_with('-')) return;
-  const std::string& word = arguments.front();
-  const std::vector<std::string> commands = commandNames();
-  if (std::find(commands.begin(), commands.end(), word) != commands.end()) return;
-  throw CommandError(ExitCode::kUsage, "unknown command '" + word + "'" + didYouMeanOf(word, "the commands", commands));
 }
 
 void declareLookingCommands(CLI::App& app, RawOptions& raw) {
@@ -380,6 +375,10 @@ void declareOtherCommands(CLI::App& app, RawOptions& raw) {
   addRecords(verify, raw, 1, CLI::detail::expected_max_vector_size, "The records, or folders of them");
   CLI::App& diff = *app.add_subcommand("diff", "Show the differences between two records");
   addRecords(diff, raw, 2, 2, "The two records");
+  CLI::App& report = *app.add_subcommand("report", "Make a time line of a record, for a viewer of traces");
+  addRecords(report, raw, 1, 1, "The record");
+  addTimelineOptions(report, raw.timeline);
+  addOutput(report, raw);
   CLI::App& explain = *app.add_subcommand("explain", "Explain an error, a diagnostic or a result, and what to do next");
   explain
       .add_option("WHAT", raw.names,

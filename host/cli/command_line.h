@@ -8,6 +8,7 @@
 #include "host/plugin/parameters.h"
 #include "host/plugin/profile.h"
 #include "host/report/run_report.h"
+#include "host/report/timeline.h"
 #include "host/run/deadlines.h"
 #include "host/run/frame_teller.h"
 #include "host/run/log_limit.h"
@@ -32,6 +33,7 @@ enum class Command {
   kVerify,
   kAnalyze,
   kDiff,
+  kReport,
   kExplain,
   kDoctor,
   kSelftest,
@@ -41,9 +43,9 @@ enum class Command {
 };
 
 // In the order of the enumerators.
-inline constexpr std::string_view kCommandNames[] = {"list",    "describe",   "run",     "experiment", "verify",
-                                                     "analyze", "diff",       "explain", "doctor",     "selftest",
-                                                     "phone",   "completion", "new"};
+inline constexpr std::string_view kCommandNames[] = {"list",     "describe", "run",        "experiment", "verify",
+                                                     "analyze",  "diff",     "report",     "explain",    "doctor",
+                                                     "selftest", "phone",    "completion", "new"};
 
 // 'quazor help' and 'quazor help NAME' are 'quazor --help' and 'quazor NAME --help'.
 inline constexpr const char* kHelpWord = "help";
@@ -76,6 +78,7 @@ struct Options {
   std::optional<LogLevel> logLevel;
   LogLimit logLimit;  // of each diagnostic
   TraceSetting trace;
+  TimelinePart part;  // of a time line to write
   Command command = Command::kList;
   bool all = false;
   bool onlyFailed = false;

@@ -1,5 +1,6 @@
 #include "host/cli/help_texts.h"
 
+#include "base/text/nearest_name.h"
 #include "host/cli/command_line.h"
 #include "host/error/exit_code.h"
 
@@ -38,6 +39,7 @@ constexpr Example kExamples[] = {
     {"quazor verify run.jsonl", "check that the recorded verdicts follow from the data"},
     {"quazor analyze run.jsonl --set analysis.frameCount=60"},
     {"quazor diff before.jsonl after.jsonl", "show what differs between two records"},
+    {"quazor report run.jsonl --format trace --output run.trace.json", "a time line for a viewer of traces"},
     {"quazor explain QZCapturePlugInErrorDomain:206", "what an error means, and what to do next"},
     {"quazor doctor", "check the installation"},
     {"quazor doctor --plugin build/my_plugin.so", "judge a plug-in as a reviewer would"},
@@ -55,14 +57,14 @@ struct ExitCodeHelp {
 constexpr ExitCodeHelp kExitCodes[] = {
     {0, "all diagnostics passed, or all experiments returned a result", "run experiment analyze"},
     {0, "no problem was found", "verify diff doctor selftest"},
-    {0, "done", "list describe explain phone completion new"},
+    {0, "done", "list describe report explain phone completion new"},
     {1, "a result was outside its limits", "run analyze"},
     {1, "a problem was found", "verify diff selftest"},
     {2, "a diagnostic or experiment ended in an error", "run experiment analyze describe"},
     {3, "a record is incomplete, because its run did not end", "verify"},
     {64, "the command line is invalid", {}},
     {66, "a plug-in, scenario, binding, profile or record cannot be read or loaded",
-     "list describe run experiment verify analyze diff explain doctor selftest phone new"},
+     "list describe run experiment verify analyze diff report explain doctor selftest phone new"},
     {70, "quazor itself failed", {}},
     {73, "a report or record cannot be written, or the record exists already", {}},
     {130, "interrupted", "list describe run experiment verify analyze doctor selftest"},
@@ -126,6 +128,14 @@ std::string helpFooter(std::string_view command) {
     if (one.commands.empty() || hasWord(one.commands, command)) codes += codeText(one.code, one.meaning);
   }
   return footerOf(examples, codes);
+}
+
+void refuseUnknownCommand(const std::vector<std::string>& arguments) {
+  if (arguments.empty() || arguments.front().starts_with('-')) return;
+  const std::string& word = arguments.front();
+  const std::vector<std::string> commands(std::begin(kCommandNames), std::end(kCommandNames));
+  if (std::find(commands.begin(), commands.end(), word) != commands.end()) return;
+  throw CommandError(ExitCode::kUsage, "unknown command '" + word + "'" + didYouMeanOf(word, "the commands", commands));
 }
 
 std::vector<std::string> withHelpAsOption(const std::vector<std::string>& arguments) {

@@ -35,6 +35,7 @@ ExitCode verifyCommand(const Options& options, Console& console, WatchedSignals*
 // parameters, errors, results, limits and measurements; dates, durations and log lines are not compared. Throws a
 // CommandError (kCannotRead).
 ExitCode diffCommand(const Options& options, Console& console);
+ExitCode reportCommand(const Options& options, Console& console);
 
 // doctor: prints one line per plug-in, backend and file that quazor would use: accepted, or refused with the reason.
 // kAllPassed if nothing is refused, else kCannotRead. With plug-ins in the options, prints what a reviewer would find

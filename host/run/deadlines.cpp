@@ -54,12 +54,12 @@ std::chrono::nanoseconds parseGrace(const std::string& text) {
   return grace;
 }
 
-std::chrono::nanoseconds parseSettle(const std::string& text) {
-  const std::string what = "--settle '" + text + "': ";
-  const std::chrono::nanoseconds settle = parseSeconds(what, text);
-  if (settle.count() < 0) throw CommandError(ExitCode::kUsage, what + "the time must not be less than zero");
-  if (settle >= kMaxLength) throw CommandError(ExitCode::kUsage, what + "the time must be less than a year");
-  return settle;
+std::chrono::nanoseconds parseTime(const std::string& option, const std::string& text) {
+  const std::string what = option + " '" + text + "': ";
+  const std::chrono::nanoseconds time = parseSeconds(what, text);
+  if (time.count() < 0) throw CommandError(ExitCode::kUsage, what + "the time must not be less than zero");
+  if (time >= kMaxLength) throw CommandError(ExitCode::kUsage, what + "the time must be less than a year");
+  return time;
 }
 
 std::chrono::nanoseconds parseHeartbeat(const std::string& text) {

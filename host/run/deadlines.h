@@ -26,9 +26,9 @@ inline constexpr std::chrono::seconds kDefaultGrace{5};
 // The time of a --grace option: SECONDS. Throws a CommandError (kUsage) if it is no number or less than zero.
 std::chrono::nanoseconds parseGrace(const std::string& text);
 
-// The time of a --settle option: SECONDS. Throws a CommandError (kUsage) if it is no number, less than zero or a year
-// or more.
-std::chrono::nanoseconds parseSettle(const std::string& text);
+// The time of an option such as "--settle": SECONDS. Throws a CommandError (kUsage) if it is no number, less than zero
+// or a year or more.
+std::chrono::nanoseconds parseTime(const std::string& option, const std::string& text);
 
 // The time of a --heartbeat option: SECONDS. Throws a CommandError (kUsage) if it is neither 0 nor at least 1.
 std::chrono::nanoseconds parseHeartbeat(const std::string& text);

@@ -1,0 +1,108 @@
+"""The time line of a record: quazor report."""
+
+import json
+import os
+import unittest
+
+from command_line_fixture import SCENARIO, RecordTest, events_in, quazor
+
+
+def timeline_of(path):
+    return json.loads(path.read_text())["traceEvents"]
+
+
+class TimelineTest(RecordTest):
+    def run_diagnostics(self, *arguments):
+        result = quazor("run", "CameraSyncDiagnostic.Back", "SingleCameraDiagnostic", "--record", self.record, *arguments)
+        self.assertEqual(result.returncode, 0, result.stderr)
+
+    def report(self, *arguments, code=0):
+        result = quazor("report", self.record, "--format", "trace", *arguments)
+        self.assertEqual(result.returncode, code, result.stderr)
+        return result
+
+    def test_every_stage_and_frame_of_the_record(self):
+        self.run_diagnostics()
+        output = self.directory / "run.trace.json"
+        result = self.report("--output", output)
+        self.assertEqual((result.stdout, result.stderr), ("", ""))
+        shown = timeline_of(output)
+        recorded = events_in(self.record)
+        stages = [event["stage"] for event in recorded if event["event"] == "stageEnded"]
+        self.assertEqual([event["name"] for event in shown if event["ph"] == "X" and event["tid"] == 1], stages)
+        frames = [event for event in shown if event["name"].startswith("frame ")]
+        self.assertEqual(len(frames), sum(len(event["columns"]["number"]) for event in recorded
+                                          if event["event"] == "frames"))
+        self.assertGreater(len(frames), 80)
+        self.assertLessEqual({event["ph"] for event in shown}, set("XiCM"))
+        # 30 frames a second, to the nanosecond.
+        steps = {round((after["ts"] - before["ts"]) * 1000) for before, after in zip(frames, frames[1:])}
+        self.assertLessEqual(steps, {33333333, 33333334})
+
+    def test_the_console_gets_the_same(self):
+        self.run_diagnostics()
+        output = self.directory / "run.trace.json"
+        self.report("--output", output)
+        self.assertEqual(self.report().stdout, output.read_text())
+
+    def test_a_part(self):
+        self.run_diagnostics()
+        times = [event["ts"] for event in json.loads(self.report("--from", "4", "--to", "5").stdout)["traceEvents"]
+                 if event["ph"] == "i"]
+        self.assertGreater(len(times), 25)
+        self.assertTrue(all(4e6 <= time <= 5e6 for time in times))
+
+    def test_a_record_that_was_cut(self):
+        self.run_diagnostics()
+        lines = self.record.read_text().splitlines(keepends=True)
+        self.record.write_text("".join(lines[:-3]))
+        result = self.report()
+        self.assertIn("the run did not end", result.stderr)
+        self.assertTrue(json.loads(result.stdout)["traceEvents"])
+
+    def test_mistakes(self):
+        self.run_diagnostics()
+        for arguments, code, text in [
+                (["report"], 64, "RECORD"),
+                (["report", self.record], 64, "--format"),
+                (["report", self.record, "--format", "html"], 64, "trace"),
+                (["report", self.record, "--format", "trace", "--from", "x"], 64, "--from 'x'"),
+                (["report", self.record, "--format", "trace", "--from", "-1"], 64, "less than zero"),
+                (["report", self.record, "--format", "trace", "--from", "2", "--to", "1"], 64, "--to '1'"),
+                (["report", self.record, "--format", "trace", "--output", self.record], 73, "is a record"),
+                (["report", self.directory, "--format", "trace"], 66, "folder"),
+                (["report", self.directory / "missing", "--format", "trace"], 66, "missing"),
+                (["reprot", self.record], 64, "did you mean 'report'"),
+        ]:
+            with self.subTest(arguments=arguments):
+                result = quazor(*arguments)
+                self.assertEqual(result.returncode, code, result.stderr)
+                self.assertIn(text, result.stderr)
+
+    @unittest.skipUnless(os.environ.get("QUAZOR_THOROUGH"), "takes a minute; QUAZOR_THOROUGH=1 runs it")
+    def test_a_time_line_that_is_too_large(self):
+        """A forged record of 2,000,000 frames."""
+        self.run_diagnostics()
+        lines = self.record.read_text().splitlines()
+        index = max(i for i, line in enumerate(lines) if '"event":"frames"' in line)
+        event = json.loads(lines[index])
+        count = 4096
+        first = 10**10
+
+        def more(i):
+            event["columns"] = {name: [first + i * count] + [1] * (count - 1)
+                                for name in ("number", "captured", "delivered", "returned")}
+            return json.dumps(event, separators=(",", ":"))
+
+        with self.record.open("w") as record:
+            for i, line in enumerate([*lines[:index], *map(more, range(490)), *lines[index + 1:]]):
+                tail = line.partition(",")[2]
+                record.write(f'{{"sequence":{i},{tail}\n')
+        result = self.report("--output", self.directory / "o", code=64)
+        self.assertIn("--from SECONDS and --to SECONDS", result.stderr)
+        self.assertFalse((self.directory / "o").exists())
+        self.report("--from", "1000", "--output", self.directory / "o")
+
+
+if __name__ == "__main__":
+    unittest.main()

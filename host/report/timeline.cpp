@@ -1,0 +1,278 @@
+#include "host/report/timeline.h"
+
+#include "host/model/trials.h"
+#include "host/record/value_json.h"
+#include "host/report/run_identity.h"
+
+#include <nlohmann/json.hpp>
+
+#include <algorithm>
+#include <cmath>
+#include <map>
+#include <optional>
+#include <string_view>
+#include <utility>
+#include <variant>
+
+namespace quazor {
+
+namespace {
+
+using Json = nlohmann::ordered_json;
+using std::chrono::nanoseconds;
+
+// The rows of a diagnostic; the streams follow, each with a row of its own.
+constexpr int kWholeRow = 0;
+constexpr int kStageRow = 1;
+constexpr int kLogRow = 2;
+constexpr int kFirstStreamRow = 3;
+
+std::string quoted(const std::string& text) {
+  return Json(text).dump(-1, ' ', false, nlohmann::detail::error_handler_t::replace);
+}
+
+// Microseconds, the unit of the format, without loss: a double has not enough digits for long runs.
+std::string microseconds(nanoseconds time) {
+  const std::int64_t count = time.count();
+  const std::string digits = std::to_string(1000 + std::abs(count % 1000)).substr(1);
+  return (count < 0 && count > -1000 ? "-" : "") + std::to_string(count / 1000) + "." + digits;
+}
+
+// Thread: one at a time.
+class TimelineWriter {
+ public:
+  TimelineWriter(const TimelinePart& part, std::size_t most) : part_(part), most_(most) {}
+
+  void add(const RunEvent& event) {
+    std::visit([this](const auto& one) { take(one); }, event);
+  }
+
+  std::string finish() {
+    if (diagnostic_) endDiagnostic(std::nullopt);
+    if (!run_) return "{\"traceEvents\":[]}\n";
+    addRow(0, kWholeRow, "run");
+    addProcess(0, "quazor");
+    addDuration({0, kWholeRow}, nanoseconds(0), end_, "run", runJson(*run_).dump());
+    return "{\"displayTimeUnit\":\"ms\",\"otherData\":" + runJson(*run_).dump() + ",\"traceEvents\":[\n" + text_ +
+           "\n]}\n";
+  }
+
+ private:
+  struct Row {
+    int process;
+    int row;
+  };
+
+  // The diagnostic that is running; its times are those of the time line.
+  struct Running {
+    int process = 0;
+    DiagnosticStarted began;
+    nanoseconds begin{};
+    nanoseconds zero{};    // of the phone's clock
+    nanoseconds cursor{};  // the end of the last stage
+    nanoseconds latest{};
+    std::optional<StageStarted> stage;
+    std::map<Stage, nanoseconds> ends;
+    std::optional<Failed> failure;
+    std::optional<Skip> skip;
+    std::map<std::string, int> streams;
+    std::map<std::string, std::uint64_t> steps;
+  };
+
+  void take(const RunStarted& run) { run_ = run; }
+
+  void take(const DiagnosticStarted& began) {
+    if (diagnostic_) endDiagnostic(std::nullopt);
+    Running& running = diagnostic_.emplace();
+    running.process = ++processes_;
+    running.began = began;
+    running.begin = std::max(run_ ? nanoseconds(began.date - run_->date) : nanoseconds(0), end_);
+    running.zero = running.cursor = running.latest = running.begin;
+    DiagnosticRecord named;
+    named.trial = {began.attempt, 0, began.repetition, 0};
+    addProcess(running.process, began.name + trialSuffix(named));
+    addRow(running.process, kWholeRow, "diagnostic");
+    addRow(running.process, kStageRow, "stages");
+    addRow(running.process, kLogRow, "log");
+  }
+
+  void take(const StageStarted& stage) {
+    if (diagnostic_) diagnostic_->stage = stage;
+  }
+
+  void take(const StageEnded& stage) {
+    if (!diagnostic_ || !diagnostic_->stage) return;
+    const nanoseconds byWall = stage.date - diagnostic_->stage->date;
+    endStage(stage.duration.value_or(byWall), "{}");
+    // The phone's clock is that of the experiment, which the plug-in makes once it is loaded.
+    if (stage.stage == Stage::kLoad) diagnostic_->zero = diagnostic_->cursor;
+  }
+
+  void take(const Logged& logged) {
+    if (!diagnostic_) return;
+    const std::string& text = logged.line.text;
+    const nanoseconds at = seen(logged.line.time);
+    std::string arguments = "{\"level\":" + quoted(std::string(nameOf(logged.line.level)));
+    const std::size_t line = text.find('\n');
+    if (line != std::string::npos) arguments += ",\"text\":" + quoted(text);
+    addInstant({diagnostic_->process, kLogRow}, at, text.substr(0, line), arguments + "}");
+  }
+
+  void take(const MeasurementsAdded& added) {
+    if (!diagnostic_) return;
+    for (const auto& [name, measurement] : added.measurements) {
+      const Row row{diagnostic_->process, kWholeRow};
+      const Json arguments = {{measurement.unit().symbol(), numberJson(measurement.value())}};
+      const std::string text = arguments.dump(-1, ' ', false, nlohmann::detail::error_handler_t::replace);
+      // What is no number is no point of a counter's curve.
+      if (std::isfinite(measurement.value())) {
+        addAt("C", row, diagnostic_->cursor, name, text);
+      } else {
+        addInstant(row, diagnostic_->cursor, name, text);
+      }
+    }
+  }
+
+  void take(const FramesTraced& traced) {
+    if (!diagnostic_) return;
+    const auto next = kFirstStreamRow + static_cast<int>(diagnostic_->streams.size());
+    const auto [found, isNew] = diagnostic_->streams.try_emplace(traced.stream, next);
+    const Row row{diagnostic_->process, found->second};
+    if (isNew) addRow(row.process, row.row, "frames of " + traced.stream);
+    const nanoseconds first =
+        traced.frames.empty() ? diagnostic_->latest : seen(nanoseconds(traced.frames[0].delivered));
+    if (std::uint64_t& step = diagnostic_->steps[traced.stream]; step != traced.step) {
+      if (step != 0 || traced.step != 1) {
+        addInstant(row, first, "from here, 1 of " + std::to_string(traced.step) + " frames is recorded", "{}");
+      }
+      step = traced.step;
+    }
+    for (const TracedFrame& frame : traced.frames) {
+      std::string arguments = "{\"captured\":" + microseconds(diagnostic_->zero + nanoseconds(frame.captured));
+      if (frame.returned) {
+        arguments += ",\"returned\":" + microseconds(diagnostic_->zero + nanoseconds(*frame.returned));
+      }
+      addInstant(row, seen(nanoseconds(frame.delivered)), "frame " + std::to_string(frame.number), arguments + "}");
+    }
+    if (traced.lost > 0) {
+      addInstant(row, diagnostic_->latest, std::to_string(traced.lost) + " frames could not be recorded", "{}");
+    }
+  }
+
+  void take(const Failed& failure) {
+    if (diagnostic_ && !diagnostic_->failure) diagnostic_->failure = failure;
+  }
+
+  void take(const DiagnosticSkipped& skipped) {
+    if (diagnostic_) diagnostic_->skip = skipped.skip;
+  }
+
+  void take(const DiagnosticEnded& ended) {
+    if (!diagnostic_) return;
+    const nanoseconds byWall = ended.date - diagnostic_->began.date;
+    diagnostic_->latest = std::max(diagnostic_->latest, diagnostic_->begin + byWall);
+    endDiagnostic(ended.verdict);
+  }
+
+  void take(const RunEnded& ended) {
+    if (run_) end_ = std::max(end_, nanoseconds(ended.date - run_->date));
+  }
+
+  void take(const AuxiliaryDataAdded& /*added*/) {}
+  void take(const ResultsReported& /*reported*/) {}
+  void take(const FaultsCounted& /*counted*/) {}
+  void take(const Heartbeat& /*heartbeat*/) {}
+  void take(const DiagnosticCompleted& /*completed*/) {}
+
+  // A moment by the phone's clock.
+  nanoseconds seen(nanoseconds byPhone) {
+    const nanoseconds at = diagnostic_->zero + byPhone;
+    diagnostic_->latest = std::max(diagnostic_->latest, at);
+    return at;
+  }
+
+  void endStage(nanoseconds length, const char* arguments) {
+    Running& running = *diagnostic_;
+    const nanoseconds begin = running.cursor;
+    running.cursor += std::max(length, nanoseconds(0));
+    running.latest = std::max(running.latest, running.cursor);
+    running.ends[running.stage->stage] = running.cursor;
+    addDuration({running.process, kStageRow}, begin, running.cursor, std::string(nameOf(running.stage->stage)),
+                arguments);
+    running.stage.reset();
+  }
+
+  void endDiagnostic(std::optional<Verdict> verdict) {
+    Running& running = *diagnostic_;
+    if (running.stage) endStage(running.latest - running.cursor, R"({"ended":false})");
+    Json arguments = {{"verdict", verdict ? Json(nameOf(*verdict)) : Json(nullptr)}, {"seed", running.began.seed}};
+    if (running.skip) arguments["skip"] = running.skip->reason;
+    if (running.failure) {
+      const std::optional<Stage> stage = running.failure->stage;
+      const auto end = stage ? running.ends.find(*stage) : running.ends.end();
+      arguments["error"] = errorJson(running.failure->error);
+      addInstant({running.process, kStageRow}, end == running.ends.end() ? running.latest : end->second, "error",
+                 textOf(Json{{"error", arguments["error"]}}));
+    }
+    addDuration({running.process, kWholeRow}, running.begin, running.latest, running.began.name, textOf(arguments));
+    end_ = running.latest;
+    diagnostic_.reset();
+  }
+
+  static std::string textOf(const Json& json) {
+    return json.dump(-1, ' ', false, nlohmann::detail::error_handler_t::replace);
+  }
+
+  void addProcess(int process, const std::string& name) {
+    addEvent("M", {process, 0}, R"(,"name":"process_name","args":{"name":)" + quoted(name) + "}");
+    addEvent("M", {process, 0},
+             R"(,"name":"process_sort_index","args":{"sort_index":)" + std::to_string(process) + "}");
+  }
+
+  void addRow(int process, int row, const std::string& name) {
+    addEvent("M", {process, row}, R"(,"name":"thread_name","args":{"name":)" + quoted(name) + "}");
+  }
+
+  void addDuration(Row row, nanoseconds begin, nanoseconds end, const std::string& name, const std::string& arguments) {
+    if (end < part_.from || begin > part_.to) return;
+    addEvent("X", row,
+             ",\"ts\":" + microseconds(begin) + ",\"dur\":" + microseconds(end - begin) + ",\"name\":" + quoted(name) +
+                 ",\"args\":" + arguments);
+  }
+
+  void addInstant(Row row, nanoseconds at, const std::string& name, const std::string& arguments) {
+    addAt("i", row, at, name, arguments);
+  }
+
+  void addAt(const char* kind, Row row, nanoseconds at, const std::string& name, const std::string& arguments) {
+    if (at < part_.from || at > part_.to) return;
+    addEvent(kind, row, ",\"ts\":" + microseconds(at) + ",\"name\":" + quoted(name) + ",\"args\":" + arguments);
+  }
+
+  void addEvent(const char* kind, Row row, const std::string& content) {
+    text_ += text_.empty() ? "" : ",\n";
+    text_ += "{\"ph\":\"" + std::string(kind) + "\",\"pid\":" + std::to_string(row.process) +
+             ",\"tid\":" + std::to_string(row.row) + content + "}";
+    if (text_.size() > most_) {
+      throw TimelineTooLarge("the time line is longer than " + std::to_string(most_ / 1'000'000) + " MB");
+    }
+  }
+
+  const TimelinePart part_;
+  const std::size_t most_;
+  std::optional<RunStarted> run_;
+  std::optional<Running> diagnostic_;
+  int processes_ = 0;
+  nanoseconds end_{};  // of the last diagnostic, later of the run
+  std::string text_;
+};
+
+}  // namespace
+
+std::string timelineText(const std::vector<RunEvent>& events, const TimelinePart& part, std::size_t most) {
+  TimelineWriter writer(part, most);
+  for (const RunEvent& event : events) writer.add(event);
+  return writer.finish();
+}
+
+}  // namespace quazor

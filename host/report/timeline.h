@@ -1,0 +1,38 @@
+// The time line of a run in the Trace Event Format (JSON) that Chrome's tracing, Perfetto and speedscope open.
+// docs/timeline.md is the public description.
+#pragma once
+
+#include "host/model/run_event.h"
+
+#include <chrono>
+#include <cstddef>
+#include <stdexcept>
+#include <string>
+#include <vector>
+
+namespace quazor {
+
+// A part of a time line: what touches it is shown.
+struct TimelinePart {
+  std::chrono::nanoseconds from = std::chrono::nanoseconds::min();
+  std::chrono::nanoseconds to = std::chrono::nanoseconds::max();
+};
+
+// The largest time line that is written. Viewers load it into memory several times over.
+inline constexpr std::size_t kMaxTimeline = 200'000'000;  // bytes
+
+// Thread: any.
+class TimelineTooLarge : public std::runtime_error {
+ public:
+  using std::runtime_error::runtime_error;
+};
+
+// Time 0 is the beginning of the run. A diagnostic begins at its own date, or where the one before it ends if that is
+// later, as on a simulated phone, whose clock runs ahead of the wall clock. Within a diagnostic the phone's clock
+// counts: a stage begins where the one before it ended. Stages that this clock does not measure have their time by the
+// wall clock. A record whose run did not end has a time line up to its last event. Throws a TimelineTooLarge if the
+// text would be longer than `most` bytes.
+std::string timelineText(const std::vector<RunEvent>& events, const TimelinePart& part = {},
+                         std::size_t most = kMaxTimeline);
+
+}  // namespace quazor
