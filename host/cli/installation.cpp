@@ -25,9 +25,10 @@ bool isThere(const fs::path& path) {
   return fs::exists(path, ignored);
 }
 
-bool isFolder(const fs::path& path) {
+// True for all but folders: what a user gives may also be a pipe.
+bool isFile(const fs::path& path) {
   std::error_code ignored;
-  return fs::is_directory(path, ignored);
+  return isThere(path) && !fs::is_directory(path, ignored);
 }
 
 std::vector<fs::path> foldersIn(const std::string& path) {
@@ -57,9 +58,11 @@ std::vector<fs::path> foldersIn(const std::string& path) {
 std::vector<fs::path> pluginsIn(const fs::path& folder) {
   std::vector<fs::path> plugins;
   std::error_code error;
+  std::error_code ignored;
   for (fs::directory_iterator at(folder, error); !error && at != fs::directory_iterator(); at.increment(error)) {
     const fs::path& file = at->path();
-    if (file.extension() == ".so" && !file.filename().string().starts_with("lib")) plugins.push_back(file);
+    const bool isNamedSo = file.extension() == ".so" && !file.filename().string().starts_with("lib");
+    if (isNamedSo && !at->is_directory(ignored)) plugins.push_back(file);
   }
   if (error && error != std::errc::no_such_file_or_directory) {
     throw CommandError(ExitCode::kCannotRead,
@@ -132,7 +135,7 @@ std::vector<fs::path> Installation::defaultPlugins() const {
 }
 
 fs::path Installation::plugin(const fs::path& name) const {
-  if (name.has_parent_path() || (isThere(name) && !isFolder(name))) return name;
+  if (name.has_parent_path() || isFile(name)) return name;
   std::vector<std::string> known;
   for (const fs::path& one : allPlugins()) {
     if (one.filename() == name || one.stem() == name) return one;
@@ -163,7 +166,7 @@ std::function<fs::path(const std::string& name, const std::vector<fs::path>& oth
         std::error_code ignored;
         return fs::equivalent(file, other, ignored);
       });
-      if (isThere(file) && !isOther) return file;
+      if (isFile(file) && !isOther) return file;
     }
     return {};
   };
@@ -203,15 +206,16 @@ fs::path Installation::namedFile(const char* kind, const fs::path& name) const {
   for (const fs::path& folder : dataFolders(kind)) {
     fs::path file = folder / name;
     file += ".json";
-    if (isThere(file)) return file;
+    if (isFile(file)) return file;
   }
   return {};
 }
 
 fs::path Installation::dataFile(const char* kind, const fs::path& name) const {
-  if (isThere(name) || name.is_absolute()) return name;
+  if (isFile(name) || name.is_absolute()) return name;
   fs::path named = namedFile(kind, name);
   if (!named.empty()) return named;
+  if (isThere(name)) return name;  // a folder, as its reader will say
   const fs::path bare = name.extension() == ".json" ? fs::path(name).replace_extension() : name;
   const std::string suggestion = didYouMeanPath(bare.string(), dataNames(kind));
   if (suggestion.empty()) return name;
@@ -224,7 +228,7 @@ std::vector<std::string> Installation::dataNames(const char* kind) const {
   for (const fs::path& folder : dataFolders(kind)) {
     for (const auto& entry : fs::recursive_directory_iterator(folder, ignored)) {
       fs::path name = fs::relative(entry.path(), folder, ignored);
-      if (name.extension() != ".json" || name.stem().extension() == ".schema") continue;
+      if (!isFile(entry.path()) || name.extension() != ".json" || name.stem().extension() == ".schema") continue;
       names.insert(name.replace_extension().string());
     }
   }

@@ -11,7 +11,7 @@ namespace quazor {
 // What a user adds to an installation.
 struct UserFolders {
   std::filesystem::path data;  // the user's own plug-ins, scenarios and so on; empty: none
-  std::string pluginPath;      // more folders with plug-ins, separated by colons
+  std::string pluginPath;      // more folders with plug-ins, separated by colons; empty: none
 
   // $XDG_DATA_HOME/quazor and QUAZOR_PLUGIN_PATH.
   static UserFolders ofEnvironment();
@@ -29,7 +29,8 @@ struct HiddenPlugin {
 // An installation, found relative to the program: PREFIX/bin/quazor. A build tree has the same layout.
 //
 // Plug-ins are searched in the folders of QUAZOR_PLUGIN_PATH, in the user's folder and in the installed one, in this
-// order, and data in the user's folder and in the installed one. A file hides one of the same name in a later folder.
+// order, and data in the user's folder and in the installed one. A file hides one of the same name in a later folder; a
+// folder hides nothing, wherever it is.
 // Folders that do not exist are skipped, except those that QUAZOR_PLUGIN_PATH names.
 //
 // Thread: one at a time; any number may read while none writes.
@@ -73,9 +74,10 @@ class Installation {
   std::filesystem::path defaultScenario() const;
   // The folders with explanations, those of the user first.
   std::vector<std::filesystem::path> explanations() const;
-  // Resolves the argument of `--phone`: returns `name` if that file exists, else the scenario of that name (for example
-  // "camera_sync/start_refused") in the folders above if there is one, else `name` unchanged. Throws
-  // a CommandError (kCannotRead) instead, which suggests them, if there are scenarios with similar names.
+  // Resolves the argument of `--phone`: returns `name` if that file, which is no folder, exists, else the scenario of
+  // that name (for example "camera_sync/start_refused_on_first") in the folders above if there is one, else `name`
+  // unchanged. Throws a CommandError (kCannotRead) instead, which suggests them, if there are scenarios with similar
+  // names.
   std::filesystem::path scenario(const std::filesystem::path& name) const;
   // The file of a scenario that another one is based on by its name: in the folders above; empty if there is none. The
   // function refers to this object.

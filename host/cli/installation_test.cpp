@@ -65,6 +65,21 @@ TEST_F(InstallationTest, PrefersAFileOfThatPathToAnInstalledScenario) {
   EXPECT_EQ(installation().scenario(file), file);
 }
 
+TEST_F(InstallationTest, PassesOverFolders) {
+  const std::filesystem::path data = std::filesystem::path(QUAZOR_DATA_DIRECTORY);
+  const std::filesystem::path installed = directory_.write(data / "profiles/strict.json", "{}");
+  const std::filesystem::path plugin = directory_.write(std::filesystem::path(QUAZOR_PLUGIN_DIRECTORY) / "one.so", "");
+  for (const char* folder : {"profiles/strict.json", "profiles/else.json", "plugins/one.so", "plugins/two.so"}) {
+    std::filesystem::create_directories(prefix_ / "mine" / folder);
+  }
+  const Installation mine(prefix_ / "bin/quazor", {prefix_ / "mine", ""});
+  EXPECT_EQ(mine.profile("strict"), installed);
+  EXPECT_EQ(mine.profileSource()("strict", {}), installed);
+  EXPECT_THAT(mine.profileNames(), testing::ElementsAre("strict"));
+  EXPECT_THAT(mine.allPlugins(), testing::ElementsAre(plugin));
+  EXPECT_TRUE(mine.hiddenPlugins().empty());
+}
+
 TEST_F(InstallationTest, LeavesAPathThatIsNothingAsItIs) {
   EXPECT_EQ(installation().scenario("sync/unknown"), "sync/unknown");
   EXPECT_EQ(installation().scenario("/sync/unknown"), "/sync/unknown");

@@ -1,11 +1,11 @@
 #include "host/cli/option_values.h"
 
+#include "base/text/control_characters.h"
 #include "base/text/input_error.h"
 #include "base/text/utf8.h"
 #include "contract/message_format.h"
 #include "host/error/exit_code.h"
 
-#include <algorithm>
 #include <charconv>
 #include <cstddef>
 #include <cstdlib>
@@ -26,11 +26,6 @@ constexpr std::uint64_t kMaxLogLines = 1'000'000'000;
 constexpr std::uint64_t kMaxLogMebibytes = 1'048'576;
 constexpr std::uint64_t kMaxTracedFramesPerStep = 1'000'000'000;
 
-bool isControl(char unit) {
-  const auto byte = static_cast<unsigned char>(unit);
-  return byte < 0x20 || byte == 0x7F;
-}
-
 void addTags(const std::string& source, const std::vector<std::string>& texts, OrderedMap<std::string>& tags) {
   OrderedMap<std::string> added;
   for (const std::string& text : texts) {
@@ -44,7 +39,7 @@ void addTags(const std::string& source, const std::vector<std::string>& texts, O
     if (key.empty()) refuse("the key is empty");
     if (value.empty()) refuse("the value is empty");
     if (text.size() > kMaxTag) refuse("a tag has at most " + std::to_string(kMaxTag) + " bytes");
-    if (std::any_of(text.begin(), text.end(), isControl)) refuse("a tag has no control characters");
+    if (hasControlCharacter(text)) refuse("a tag has no control characters");
     if (findInvalidUtf8(text)) refuse("the text is not valid UTF-8");
     if (added.contains(key)) refuse("the key is set twice");
     added.set(key, value);

@@ -52,6 +52,10 @@ TEST_F(TagsTest, AreRefusedWithTheReason) {
   EXPECT_EQ(refusal({"a=1", "a=2"}), "--tag 'a=2': the key is set twice");
   EXPECT_EQ(refusal({"a=\x01"}), "--tag 'a=\x01': a tag has no control characters");
   EXPECT_EQ(refusal({"a=\x7f"}), "--tag 'a=\x7f': a tag has no control characters");
+  EXPECT_EQ(refusal({"a=\xC2\x9B"
+                     "2J"}),
+            "--tag 'a=\xC2\x9B"
+            "2J': a tag has no control characters");
   EXPECT_EQ(refusal({"a=\xff"}), "--tag 'a=\xff': the text is not valid UTF-8");
   EXPECT_EQ(tagsOf({"a=" + std::string(254, 'x')}).size(), 1U);
   EXPECT_THAT(refusal({"a=" + std::string(255, 'x')}), testing::EndsWith("a tag has at most 256 bytes"));

@@ -1,6 +1,7 @@
 #include "host/command/explanations.h"
 
 #include "base/json/json_cursor.h"
+#include "base/text/control_characters.h"
 #include "base/text/input_error.h"
 #include "base/text/nearest_name.h"
 #include "contract/message_format.h"
@@ -30,8 +31,7 @@ constexpr std::array<std::string_view, 4> kKinds{"diagnostic", "experiment", "an
 
 std::string lineOf(const JsonCursor& cursor) {
   std::string text = cursor.text();
-  const auto isControl = [](char unit) { return static_cast<unsigned char>(unit) < 0x20 || unit == 0x7F; };
-  if (text.front() == ' ' || text.back() == ' ' || std::ranges::any_of(text, isControl)) {
+  if (text.front() == ' ' || text.back() == ' ' || hasControlCharacter(text)) {
     cursor.fail("the text must be one line without leading or trailing spaces.");
   }
   return text;

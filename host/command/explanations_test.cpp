@@ -115,6 +115,8 @@ TEST(ParseExplanations, RefusesWhatIsNotExactlyOfTheForm) {
       {"a blank after a text", with(plain, R"("T")", R"("T ")"), "errors[0].title: the text must be one line"},
       {"two lines", with(plain, R"("M")", R"("M\nN")"), "errors[0].meaning: the text must be one line"},
       {"a delete character", with(plain, R"("M")", "\"M\x7FN\""), "errors[0].meaning: the text must be one line"},
+      {"a control character of two bytes", with(plain, R"("M")", "\"M\xC2\x9BN\""),
+       "errors[0].meaning: the text must be one line"},
       {"no symbol", with(full, R"(["kFive"])", "[]"), "errors[0].symbols: at least one entry is required."},
       {"an unknown key of a message", with(full, R"("text")", R"("txt")"), "errors[0].messages[0]: unknown key"},
       {"a message from nobody", with(full, R"(["D"])", "[]"), "messages[0].from: at least one entry is required."},

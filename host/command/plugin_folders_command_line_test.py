@@ -81,8 +81,13 @@ class FoundPluginsTest(PluginFoldersTest):
                 self.assert_refused(self.quazor("list", path=path), 64, "QUAZOR_PLUGIN_PATH", why)
         missing = self.directory / "missing"
         self.assert_refused(self.quazor("list", path=str(missing)), 66, f"the folder '{missing}' does not exist")
-        self.assertIn(SHIPPED, self.listed(path=""))
         self.assertEqual(self.quazor("explain", "--format", "json", path="here").returncode, 0)
+
+    def test_an_empty_path_of_the_environment_is_none(self):
+        self.assertEqual(self.listed(path=""), self.listed())
+        without = self.quazor("doctor")
+        empty = self.quazor("doctor", path="")
+        self.assertEqual((empty.returncode, empty.stdout, empty.stderr), (0, without.stdout, ""))
 
     def test_what_is_no_plug_in_is_skipped(self):
         (self.own / "notes.txt").write_text("no plug-in")
@@ -101,12 +106,24 @@ class NamedPluginsTest(PluginFoldersTest):
         shutil.copy(PLUGINS / "moody_plugin.so", self.own)
         self.assertEqual(self.listed("--plugin", "moody_plugin"), ["Moody"])
 
-    def test_a_folder_of_that_name_is_no_plug_in(self):
-        (self.directory / "sensor_images").mkdir()
+    def test_a_folder_hides_no_installed_name(self):
+        for name in ("sensor_images", "strict", "healthy", "camera_sync/start_refused_on_first", "vivid", "unknown"):
+            (self.directory / name).mkdir(parents=True)
         before = os.getcwd()
         self.addCleanup(os.chdir, before)
         os.chdir(self.directory)
         self.assertEqual(self.listed("--plugin", "sensor_images"), ["NimbeImageExperiment"])
+        for option in ("--profile", "--parameters"):
+            result = self.quazor("run", SHIPPED, option, "strict", "--phone", "healthy")
+            self.assertEqual(result.returncode, 0, result.stderr)
+            self.assertIn("profile strict.json", result.stdout)
+        failed = self.quazor("run", SHIPPED, "--phone", "camera_sync/start_refused_on_first", "--format", "json")
+        self.assertEqual(failed.returncode, 2, failed.stderr)
+        self.assertEqual(self.quazor("selftest", "healthy", "--seeds", "1").returncode, 0)
+        absent = self.quazor("run", SHIPPED, "--phone", "linux:vivid")
+        self.assertNotIn("directory", absent.stderr)
+        for arguments in (("--profile", "unknown"), ("--phone", "unknown"), ("--phone", "linux:unknown")):
+            self.assert_refused(self.quazor("run", SHIPPED, *arguments), 66, "unknown: this is a directory, not a file")
 
     def test_an_unknown_name_is_told_what_there_is(self):
         shutil.copy(WORKING, self.own)

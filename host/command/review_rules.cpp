@@ -1,5 +1,6 @@
 #include "host/command/review_rules.h"
 
+#include "base/text/control_characters.h"
 #include "contract/message_format.h"
 #include "host/text/display_width.h"
 #include "host/text/table.h"
@@ -39,8 +40,7 @@ bool hasUsualForm(std::string_view name) {
 
 // What a shell, a pattern of names or an option of quazor would read as something else.
 bool isMisread(char unit) {
-  return static_cast<unsigned char>(unit) <= ' ' || unit == '\x7F' ||
-         std::string_view("*?[]:=,'\"\\$`&|;<>(){}#!~/").find(unit) != std::string_view::npos;
+  return std::string_view(" *?[]:=,'\"\\$`&|;<>(){}#!~/").find(unit) != std::string_view::npos;
 }
 
 // The first names, and how many more there are.
@@ -115,7 +115,7 @@ std::string_view nameOf(Rating rating) {
 ReviewFindings reviewName(std::string_view kind, const std::string& name) {
   const std::string subject = "name";
   if (name.empty()) return {{Rating::kProblem, subject, formatMessage("an empty name of a %@; give it one", kind)}};
-  if (std::any_of(name.begin(), name.end(), isMisread)) {
+  if (hasControlCharacter(name) || std::any_of(name.begin(), name.end(), isMisread)) {
     return {{Rating::kProblem, subject,
              formatMessage("'%@' has characters that a shell or an option of quazor reads as something else; use "
                            "letters, digits and dots",
@@ -178,10 +178,9 @@ ReviewFindings reviewSummary(const std::string& subject, const std::string& summ
   if (summary.empty()) {
     return {{Rating::kProblem, subject, "has no summary; say in one sentence what it does"}};
   }
-  const auto isControl = [](char unit) {
-    return (static_cast<unsigned char>(unit) < ' ' && unit != '\n') || unit == '\x7F';
-  };
-  if (std::any_of(summary.begin(), summary.end(), isControl)) {
+  std::string withoutLineEnds = summary;
+  std::erase(withoutLineEnds, '\n');  // these have a finding of their own
+  if (hasControlCharacter(withoutLineEnds)) {
     return {{Rating::kProblem, subject, "its summary has a control character; write plain text"}};
   }
   std::vector<std::string> wrong;

@@ -1,5 +1,6 @@
 #include "host/plugin/parameter_range.h"
 
+#include "base/text/control_characters.h"
 #include "base/text/input_error.h"
 #include "base/text/nearest_name.h"
 #include "base/text/utf8.h"
@@ -56,8 +57,7 @@ double smallestOf(const QZParameterRange& range) {
 }
 
 void validateUnit(const std::string& unit) {
-  const auto isControl = [](char byte) { return static_cast<unsigned char>(byte) < 0x20 || byte == 0x7F; };
-  if (findInvalidUtf8(unit) || std::any_of(unit.begin(), unit.end(), isControl)) {
+  if (findInvalidUtf8(unit) || hasControlCharacter(unit)) {
     throw InputError("its unit is not one line of UTF-8");
   }
 }

@@ -113,6 +113,8 @@ TEST(ParameterRange, HasADefaultThatFitsAndAUnitOfOneLine) {
   range.setDefault(1);
   range.setUnit("s\n");
   EXPECT_EQ(problemOf(range), "its unit is not one line of UTF-8");
+  range.setUnit("s\xC2\x9B");
+  EXPECT_EQ(problemOf(range), "its unit is not one line of UTF-8");
   range.setUnit("\xFF");
   EXPECT_EQ(problemOf(range), "its unit is not one line of UTF-8");
   range.setUnit("\xC2\xB5s");

@@ -1,5 +1,6 @@
 #include "host/text/table.h"
 
+#include "base/text/control_characters.h"
 #include "base/text/hexadecimal.h"
 #include "base/text/utf8.h"
 #include "host/text/display_width.h"
@@ -16,13 +17,6 @@ namespace {
 constexpr std::size_t kGap = 2;               // between two columns
 constexpr std::string_view kNothing = "-";    // a cell without a value
 constexpr std::size_t kMinFoldedColumn = 16;  // a narrower one is hard to read
-
-bool isControl(unsigned char unit) { return unit < 0x20 || unit == 0x7F; }
-
-// True for the control characters U+0080 to U+009F, two bytes in UTF-8, which terminals also interpret.
-bool isWideControl(std::string_view character) {
-  return character.size() == 2 && character[0] == '\xC2' && static_cast<unsigned char>(character[1]) < 0xA0;
-}
 
 // True for the characters that change the direction of the text around them, which can make a name look like another:
 // U+061C, U+200E, U+200F, U+202A to U+202E, U+2066 to U+2069.
@@ -47,11 +41,9 @@ std::string shownText(std::string_view text, std::string_view allowed) {
     const Utf8Sequence sequence = firstUtf8Sequence(text);
     const std::string_view character = text.substr(0, sequence.length);
     text.remove_prefix(sequence.length);
-    if (isWideControl(character)) {
-      appendEscaped(shown, character.substr(1));  // the second byte equals the code point
-    } else if (!sequence.wellFormed || changesDirection(character) ||
-               (isControl(static_cast<unsigned char>(character.front())) &&
-                allowed.find(character.front()) == std::string_view::npos)) {
+    if (isControlCharacter(character) && allowed.find(character.front()) == std::string_view::npos) {
+      appendEscaped(shown, character.substr(character.size() - 1));  // the last byte equals the code point
+    } else if (!sequence.wellFormed || changesDirection(character)) {
       appendEscaped(shown, character);
     } else {
       shown += character;
