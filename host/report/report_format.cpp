@@ -31,13 +31,16 @@ namespace {
 std::string textReport(const RunStarted& run, const std::vector<DiagnosticRecord>& records,
                        const std::optional<std::string>& interrupted, const TextContent& content) {
   std::ostringstream text;
+  printRun(text, run);
   for (std::size_t i = 0; i < records.size(); ++i) {
     printReport(text, run, records[i], {false, false, content.verbose});
     if (!content.verbose) printRepetitionEnd(text, records, i + 1);
   }
   printEnd(text, run, records, interrupted, content, false);
-  if (interrupted && !interrupted->empty()) {
-    text << "Interrupted while " << printable(*interrupted) << " was running.\n";
+  if (interrupted && (run.analyzed || !interrupted->empty())) {
+    std::string sentence = interruptionText(run, *interrupted);
+    sentence.front() = run.analyzed ? 'T' : 'I';
+    text << sentence << ".\n";
   }
   return text.str();
 }
@@ -119,7 +122,7 @@ std::string reportText(Format format, const RunStarted& run, const std::vector<D
       return withRunColumns(csv, run, seeds);
     }
     case Format::kOcp: return ocpReport(run, records, interrupted);
-    case Format::kJunit: return junitReport(run, records, interrupted);
+    case Format::kJunit: return junitReport(run, records, interrupted, {text.allowSkips, run.acceptFlaky});
     case Format::kJson: break;
   }
   nlohmann::ordered_json document =
@@ -160,6 +163,11 @@ void printEnd(std::ostream& out, const RunStarted& run, const std::vector<Diagno
   if (hasFlaky && !run.acceptFlaky)
     out << "A pass after an error counts as an error, unless --accept-flaky is given.\n";
   if (!run.ofExperiments) printFailures(out, records, colour, text.isExplained);
+  const ExitRules rules{text.allowSkips, run.acceptFlaky};
+  if (interrupted || runVerdictOf(records, run.acceptFlaky) != Verdict::kSkip) return;
+  if (exitCodeOf(records, rules) == ExitCode::kAllPassed) return;
+  out << (text.allowSkips ? "Nothing passed, so the exit code is 2, in spite of --allow-skips.\n"
+                          : "What was skipped makes the exit code 2, unless --allow-skips is given.\n");
 }
 
 }  // namespace quazor
