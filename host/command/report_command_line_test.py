@@ -29,7 +29,7 @@ class TimelineTest(RecordTest):
         shown = timeline_of(output)
         recorded = events_in(self.record)
         stages = [event["stage"] for event in recorded if event["event"] == "stageEnded"]
-        self.assertEqual([event["name"] for event in shown if event["ph"] == "X" and event["tid"] == 1], stages)
+        self.assertEqual([event["name"] for event in shown if event["ph"] in "Xi" and event["tid"] == 1], stages)
         frames = [event for event in shown if event["name"].startswith("frame ")]
         self.assertEqual(len(frames), sum(len(event["columns"]["number"]) for event in recorded
                                           if event["event"] == "frames"))

@@ -235,9 +235,14 @@ class TimelineWriter {
 
   void addDuration(Row row, nanoseconds begin, nanoseconds end, const std::string& name, const std::string& arguments) {
     if (end < part_.from || begin > part_.to) return;
+    // Viewers turn a duration into a begin and an end and sort these by time. Only whole microseconds add up to the
+    // begin of the next duration without a rounding error, and one without length would end too late.
+    const auto first = std::chrono::floor<std::chrono::microseconds>(begin);
+    const auto length = std::chrono::floor<std::chrono::microseconds>(end) - first;
+    if (length.count() == 0) return addInstant(row, begin, name, arguments);
     addEvent("X", row,
-             ",\"ts\":" + microseconds(begin) + ",\"dur\":" + microseconds(end - begin) + ",\"name\":" + quoted(name) +
-                 ",\"args\":" + arguments);
+             ",\"ts\":" + std::to_string(first.count()) + ",\"dur\":" + std::to_string(length.count()) +
+                 ",\"name\":" + quoted(name) + ",\"args\":" + arguments);
   }
 
   void addInstant(Row row, nanoseconds at, const std::string& name, const std::string& arguments) {

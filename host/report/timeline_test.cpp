@@ -78,6 +78,14 @@ TEST(Timeline, HasStagesOneAfterTheOther) {
   expectPeriod(runs[1], 0, 3'257'000);
 }
 
+TEST(Timeline, HasAStageWithoutLengthAsAnInstant) {
+  std::vector<RunEvent> events = tracedRun();
+  std::get<StageEnded>(events[5]).duration = 0ns;
+  const Json line = lineOf(events);
+  EXPECT_EQ(eventsIn(line, "X", "setup").size(), 0U);
+  EXPECT_DOUBLE_EQ(eventIn(line, "i", "setup")["ts"], 7000);
+}
+
 TEST(Timeline, HasADiagnosticAsLongAsWhatItShows) {
   const Json diagnostic = eventIn(lineOf(tracedRun()), "X", "A");
   expectPeriod(diagnostic, 2000, 3'255'000);
