@@ -195,11 +195,16 @@ void requirePhone(const std::filesystem::path& file, const Options& options, con
                                                 "'quazor phone list' shows them");
 }
 
+void addFilesOf(const std::vector<Profile>& profiles, std::vector<std::filesystem::path>& files) {
+  for (const Profile& one : profiles) files.push_back(one.file);
+}
+
 // The selected phone.
 struct ChosenPhone {
   std::string name;  // as records have it
   SeededPhoneMaker make;
   std::vector<SkipRule> absent;
+  std::vector<std::filesystem::path> bases{};  // the files that it is based on
 };
 
 ChosenPhone choosePhone(const Options& options, const Installation& installation) {
@@ -213,18 +218,21 @@ ChosenPhone choosePhone(const Options& options, const Installation& installation
       options.phone.empty() ? installation.defaultScenario() : installation.scenario(options.phone);
   requirePhone(scenario, options, installation);
   const ScenarioSource source = installation.scenarioSource();
-  return {scenario.string(), seededPhonesOfScenario(scenario, options.realTime, source),
-          absentOnScenario(scenario, source)};
+  ScenarioSummary summary = summaryOfScenario(scenario, source);
+  return {scenario.string(), seededPhonesOfScenario(scenario, options.realTime, source), std::move(summary.absent),
+          std::move(summary.bases)};
 }
 
 }  // namespace
 
 ExitCode runCommand(const Options& given, const Installation& installation, Console& console, WatchedSignals* signals) {
-  const Options options = given.onlyFailed ? optionsToRunAgain(given, installation) : given;
+  Options options = given.onlyFailed ? optionsToRunAgain(given, installation) : given;
   if (options.onlyFailed && options.names.empty()) return performNothing(options, installation, console);
   Selection selection = select(options, installation, signals);
   refuseUnusedSkips(options.choice.skips, selection);
   const ChosenPhone phone = choosePhone(options, installation);
+  options.bases = phone.bases;
+  addFilesOf(selection.profiles, options.bases);
   tellLimitsForOtherValues(selection.profiles, selection.diagnostics, console.err);
   std::vector<Job> jobs;
   for (ResolvedDiagnostic& one : selection.diagnostics) {
@@ -293,6 +301,7 @@ ExitCode analyzeCommand(const Options& given, const Installation& installation, 
   }
   if (options.plugins.empty()) options.plugins = recordedPlugins(run.began.plugins, installation);
   const Selection selection = select(options, installation, signals);
+  addFilesOf(selection.profiles, options.bases);
   std::vector<QZExperimentResult> results(analysable.size());
   std::vector<ResolvedDiagnostic> rebound;
   std::vector<Job> jobs;
