@@ -270,6 +270,19 @@ ResolvedParameters reboundParameters(const DiagnosticRecord& record, const Resol
   return parameters;
 }
 
+// The limits of the record. One whose diagnostics were skipped or ended in an error there is not missed in the
+// analysis, as it was not in the run.
+std::vector<UserLimit> limitsToAnalyze(const RecordedRun& run) {
+  std::vector<UserLimit> limits = run.began.limits;
+  for (UserLimit& limit : limits) {
+    limit.onlyIfSelected = limit.onlyIfSelected ||
+                           std::any_of(run.records.begin(), run.records.end(), [&limit](const DiagnosticRecord& one) {
+                             return !isOfLimit(one) && appliesTo(limit, one.name);
+                           });
+  }
+  return limits;
+}
+
 }  // namespace
 
 ExitCode analyzeCommand(const Options& given, const Installation& installation, Console& console,
@@ -325,7 +338,7 @@ ExitCode analyzeCommand(const Options& given, const Installation& installation, 
   began.phone = run.began.phone;
   began.seed = run.began.seed;
   began.acceptFlaky = run.began.acceptFlaky;
-  began.limits = limitsOfAnalysis(run.began.limits, selection.limits);
+  began.limits = limitsOfAnalysis(limitsToAnalyze(run), selection.limits);
   return perform(options, installation, console, std::move(began), jobs, selection.failed, runOptions, nullptr,
                  signals);
 }
