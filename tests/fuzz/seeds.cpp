@@ -190,6 +190,17 @@ void writeDevices(const fs::path& folder) {
   reports.add("stream", bytes("\0\6\3\1\0\0\0\7\3\5\4\0\4abcd\5"));
   reports.add("one_image", bytes("\1\1\1\0\5\3\1\0\0\0"));
   reports.add("error", bytes("\1\11\1\1\5\3\1\0\0\0\0"));
+  // Answers of drivers that are true, with some bytes of metadata, and some that are not.
+  const Seeds drivers(folder, "camera_driver");
+  drivers.add("true", bytes("\0\10\0\0\4\2\4\1\377\1\0\0\10\3\7\1"));
+  drivers.add("damaged", std::string(100, '\0') + std::string(bytes("\xe0\4\0\3\1\2\3\xc1\xf1\0\0\1\x7f")));
+  // A board of one sensor, and its own.
+  const Seeds topologies(folder, "media_topology");
+  topologies.add("own", bytes("\1\3"));
+  topologies.add("sensor", bytes("\0\0\3\0\0\0\0\1\3\0\2\4\3\1\0\2\1\3\2\4\1\0\0\1\1\1\0\2\0\2\1\0\1\1\2\3"));
+  const Seeds machines(folder, "device_probe");
+  machines.add("cameras", bytes("\2\2\1\1\1"));
+  machines.add("all", bytes("\25\22\0\0\0\0\0\0\0\0\0\0\0\0\0\3Cam\7\5\1\11\60\241\1\300\2ab"));
 }
 
 void writeAll(const fs::path& data, const fs::path& folder) {

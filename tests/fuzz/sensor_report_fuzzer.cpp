@@ -1,6 +1,7 @@
 // Arbitrary input reports in any order, mixed with errors, closes and removals: only complete images reach the
 // receiver, with the values in their bytes, and nothing follows an error.
 #include "diagnostics/sensor_images/nimbe_image_experiment.h"
+#include "tests/fuzz/byte_input.h"
 #include "tests/fuzz/fuzzing.h"
 #include "tests/support/fake_sensor.h"
 
@@ -53,17 +54,9 @@ void requireImage(const Value& frameID, const Array& scanI, const Array& scanQ, 
   requireSamples(scanQ, record.scanQ);
 }
 
-// Numbers from the input; zeros after its end.
-class Input {
+class Input : public ByteInput {
  public:
-  Input(const std::uint8_t* data, std::size_t size) : at_(data), end_(data + size) {}
-
-  bool empty() const { return at_ == end_; }
-  std::uint8_t byte() { return empty() ? std::uint8_t{0} : *at_++; }
-  std::size_t number() {
-    const std::size_t low = byte();
-    return low | static_cast<std::size_t>(byte()) << 8;
-  }
+  using ByteInput::ByteInput;
 
   struct Report {
     std::uint8_t reportID;
@@ -92,9 +85,6 @@ class Input {
     if ((choice & 2) != 0) return 792;
     return (choice & 4) != 0 ? 788 + byte() % 8 : number();
   }
-
-  const std::uint8_t* at_;
-  const std::uint8_t* end_;
 };
 
 DiagnosticErrorPtr someError() { return makeError("BenchErrorDomain", 7, "Broken."); }

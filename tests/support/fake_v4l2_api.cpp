@@ -231,6 +231,7 @@ int FakeV4l2Api::ioctl(int descriptor, unsigned long request, void* argument) {
   int number = 0;
   if (faulty(node, request, number)) return -number;
   const int result = call(node, descriptor, request, argument);
+  if (result == 0 && afterCall) afterCall(request, argument);
   changed_.notify_all();
   return -result;
 }

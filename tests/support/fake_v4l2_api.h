@@ -120,6 +120,8 @@ class FakeV4l2Api : public V4l2Api {
   void failNext(const std::string& path, unsigned long request, int number, int times = 1, int after = 0);
   // Called before each call of a driver, on the same thread. Set it while there are no calls.
   std::function<void(unsigned long request)> beforeCall;
+  // Called after each successful call, and may change its answer. Set it while there are no calls.
+  std::function<void(unsigned long request, void* argument)> afterCall;
   int failNextMaps = 0;              // with ENOMEM
   int mapsBeforeFailure = 0;         // that succeed before those
   int makeEventProblem = 0;          // an error number

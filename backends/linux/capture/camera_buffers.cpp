@@ -9,8 +9,11 @@
 namespace quazor {
 namespace {
 
+// What a driver says beyond a century is nonsense, and its nanoseconds would not fit.
 std::chrono::nanoseconds timeOf(const timeval& time) {
-  return std::chrono::seconds(time.tv_sec) + std::chrono::microseconds(time.tv_usec);
+  constexpr std::int64_t kMaxSeconds = 4'000'000'000;
+  return std::chrono::seconds(std::clamp<std::int64_t>(time.tv_sec, 0, kMaxSeconds)) +
+         std::chrono::microseconds(std::clamp<std::int64_t>(time.tv_usec, 0, 999'999));
 }
 
 }  // namespace

@@ -7,26 +7,26 @@ namespace {
 
 using namespace std::chrono_literals;
 
-constexpr std::size_t kInfrared = 3;
+constexpr std::size_t kPairedCamera = 3;
 
 // Four frames of a camera whose metadata is stamped 3 ms later.
 std::vector<SeenFrame> framesOf(const std::string& driver, std::optional<MetadataPairing> pairing,
                                 std::vector<std::string>* lines) {
   Binding binding = fakeBinding();
-  binding.cameras[kInfrared].metadata.pairing = pairing;
+  binding.cameras[kPairedCamera].metadata.pairing = pairing;
   SeenFrames seen;
   FakeCameras fake(binding);
-  fake.kernel->with(fake.nodes[kInfrared], [&](FakeNode& node) {
+  fake.kernel->with(fake.nodes[kPairedCamera], [&](FakeNode& node) {
     node.driver = driver;
     node.metadataStampedAhead = 3ms;
     return 0;
   });
   const auto log = std::make_shared<LogLines>();
   sharedLog().setBackend(log, LogLevel::kError);
-  fake.begin(kInfrared, seen.handler());
+  fake.begin(kPairedCamera, seen.handler());
   for (int i = 0; i < 6; ++i) fake.kernel->passTime(34ms);  // also what frames wait for metadata
   std::vector<SeenFrame> frames = seen.wait(4);
-  EXPECT_EQ(fake.stop(kInfrared), "done");
+  EXPECT_EQ(fake.stop(kPairedCamera), "done");
   sharedLog().setBackend(nullptr, LogLevel::kError);
   *lines = log->lines();
   return frames;

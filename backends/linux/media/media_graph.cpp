@@ -8,9 +8,9 @@
 namespace quazor {
 namespace {
 
-// The text of a fixed-size field of a packed structure, which has no null if it is full.
+// The same as fixedText(), for a field of a packed structure.
 std::string nameIn(const media_v2_entity& entity) {
-  const char* const end = std::find(std::begin(entity.name), std::end(entity.name), '\0');
+  const char* const end = std::find(std::begin(entity.name), std::prev(std::end(entity.name)), '\0');
   return {std::begin(entity.name), end};
 }
 

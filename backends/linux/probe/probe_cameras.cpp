@@ -32,7 +32,6 @@ constexpr double kDefaultRate = 30;
 constexpr std::uint32_t kDefaultWidth = 640;
 constexpr std::uint32_t kDefaultHeight = 480;
 constexpr std::uint64_t kMaxPixels = std::uint64_t{1920} * 1080;
-constexpr std::uint32_t kMaxSide = 65536;  // the maximum of a binding
 
 bool isDefaultRate(const FrameInterval& interval) { return std::abs(interval.framesPerSecond() - kDefaultRate) < 0.01; }
 
@@ -255,7 +254,7 @@ class CameraProbe {
     const bool isTaken = cameras_.size() == kPorts.size();
     if (!mode) {
       tell("    unsuitable: " + reason);
-    } else if (node.driver.empty() && node.card.empty() && node.busInfo.empty()) {
+    } else if (!bindableText(node.driver) && !bindableText(node.card) && !bindableText(node.busInfo)) {
       tell("    unsuitable: its driver reports nothing that a binding could use to identify it");
     } else if (!match) {
       tell(
@@ -271,8 +270,7 @@ class CameraProbe {
   // The shortest match that selects only this camera: what the driver reports, then the USB interface, then the name of
   // the node, then the place in sysfs. Nothing if there is none.
   std::optional<VideoNodeMatch> matchOf(const V4l2DeviceInfo& node) const {
-    const auto textIn = [](const std::string& text) { return text.empty() ? std::nullopt : std::optional(text); };
-    VideoNodeMatch match{textIn(node.driver), textIn(node.card), textIn(node.busInfo), {}, {}};
+    VideoNodeMatch match{bindableText(node.driver), bindableText(node.card), bindableText(node.busInfo), {}, {}};
     const auto isOnly = [&] {
       return std::ranges::count_if(nodes_, [&](const V4l2DeviceInfo& other) {
                return other.kind == node.kind && matches(other, match);
@@ -281,10 +279,10 @@ class CameraProbe {
     if (isOnly()) return match;
     match.usbInterface = node.usbInterface;
     if (isOnly()) return match;
-    match.name = textIn(node.systemName);
+    match.name = bindableText(node.systemName);
     if (isOnly()) return match;
     match.name.reset();
-    match.path = textIn(node.device);
+    match.path = bindableText(node.device);
     return isOnly() ? std::optional(match) : std::nullopt;
   }
 

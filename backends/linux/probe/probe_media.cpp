@@ -3,6 +3,7 @@
 #include "backends/linux/binding/media_bus_codes.h"
 #include "backends/linux/media/subdevice.h"
 #include "backends/linux/video/v4l2_device.h"
+#include "base/text/utf8.h"
 #include "contract/message_format.h"
 
 #include <algorithm>
@@ -20,6 +21,9 @@ using Json = nlohmann::ordered_json;
 using Path = std::vector<const MediaLink*>;
 
 constexpr std::size_t kMaxPaths = 1000;
+// The links at which the search looks: it could try each order of many entities.
+constexpr std::size_t kMaxSteps = 10'000'000;
+constexpr std::size_t kMaxPathLength = 100;  // in links
 
 // All paths to an entity over links between sub-devices, set or not.
 class PathFinder {
@@ -40,8 +44,10 @@ class PathFinder {
       return;
     }
     for (const MediaLink& link : graph_.links()) {
+      if (++steps_ > kMaxSteps) return;
       const MediaEntity* const source = link.sink.entity == entity.id ? graph_.entity(link.source.entity) : nullptr;
-      if (source == nullptr || !source->isSubdevice || isVisited(*source) || found_.size() >= kMaxPaths) continue;
+      if (source == nullptr || !source->isSubdevice || isVisited(*source)) continue;
+      if (found_.size() >= kMaxPaths || path_.size() >= kMaxPathLength) return;
       path_.push_back(&link);
       extend(*source);
       path_.pop_back();
@@ -55,6 +61,7 @@ class PathFinder {
   const MediaGraph& graph_;
   Path path_;
   std::vector<Path> found_;
+  std::size_t steps_ = 0;
 };
 
 // Prepares one path: which links have to be set, and which formats.
@@ -80,6 +87,7 @@ class PathPlan {
         fail(reason, "its node has no format for " + mediaBusCodeText(end_.code));
         continue;
       }
+      if (!canBeBound(reason)) return false;
       found->format = formats.front();
       found->width = end_.width;
       found->height = end_.height;
@@ -96,6 +104,25 @@ class PathPlan {
   static bool fail(std::string* reason, std::string text) {
     *reason = std::move(text);
     return false;
+  }
+  // False, and the reason, if a binding cannot name an entity or give a size of the path.
+  bool canBeBound(std::string* reason) const {
+    std::vector<std::string> names;
+    for (const LinkBinding& link : links_) names.insert(names.end(), {link.source.entity, link.sink.entity});
+    for (const auto& [place, format] : pads_) {
+      names.push_back(graph_.nameOf(place).entity);
+      if (std::min(format.width, format.height) == 0 || std::max(format.width, format.height) > kMaxSide) {
+        return fail(reason, nameOf(place) + " has the format " + textOf(format) + ", which a binding cannot set");
+      }
+    }
+    for (const std::string& name : names) {
+      if (!bindableText(name)) return fail(reason, "a binding cannot name the entity \"" + name + "\"");
+      const std::size_t count = graph_.named(name).size();
+      if (count == 1) continue;
+      return fail(reason,
+                  formatMessage("%@ entities have the name \"%@\", so a binding cannot distinguish them", count, name));
+    }
+    return true;
   }
   std::vector<PadBinding> pads() const {
     std::vector<PadBinding> bindings;
@@ -202,11 +229,14 @@ std::tuple<std::ptrdiff_t, std::size_t> costOf(const Path& path) {
 }
 
 MediaDeviceMatch matchOf(const MediaDeviceInfo& info) {
-  const auto textIn = [](const std::string& text) { return text.empty() ? std::nullopt : std::optional(text); };
-  return {textIn(info.driver), textIn(info.model), textIn(info.busInfo)};
+  return {bindableText(info.driver), bindableText(info.model), bindableText(info.busInfo)};
 }
 
 }  // namespace
+
+std::optional<std::string> bindableText(const std::string& text) {
+  return text.empty() || findInvalidUtf8(text) ? std::nullopt : std::optional(text);
+}
 
 Json mediaEntry(const MediaBinding& media) {
   Json device = Json::object();

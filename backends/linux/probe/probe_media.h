@@ -7,7 +7,9 @@
 
 #include <nlohmann/json.hpp>
 
+#include <cstdint>
 #include <memory>
+#include <optional>
 #include <string>
 #include <vector>
 
@@ -22,6 +24,12 @@ struct ProbedPath {
   VideoFormat format;    // of the video node
   bool hasRate = false;  // the node's intervals or the sensor's blanking set the rate
 };
+
+// The longest side of a picture in a binding.
+inline constexpr std::uint32_t kMaxSide = 65536;
+
+// The text as a binding can have it; nothing if it is empty, or cut within a character.
+std::optional<std::string> bindableText(const std::string& text);
 
 // The entry "media" of a camera in a binding.
 nlohmann::ordered_json mediaEntry(const MediaBinding& media);

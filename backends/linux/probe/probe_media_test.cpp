@@ -97,6 +97,47 @@ TEST_F(ProbeMediaTest, ANodeWithoutASensorUpstreamIsUnsuitable) {
   EXPECT_TRUE(binding_.cameras.empty());
 }
 
+TEST_F(ProbeMediaTest, EntitiesThatABindingCannotNameAreTheReason) {
+  change([](FakeMedia& media) { media.entities[board::kScaler].name = "Sc\xC3"; });
+  probe();
+  EXPECT_THAT(lines_, Contains("    unsuitable: a binding cannot name the entity \"Sc\xC3\""));
+  change([](FakeMedia& media) { media.entities[board::kScaler].name = "Converter"; });
+  probe();
+  EXPECT_THAT(lines_,
+              Contains("    unsuitable: 2 entities have the name \"Converter\", so a binding cannot distinguish "
+                       "them"));
+  EXPECT_TRUE(binding_.cameras.empty());
+}
+
+TEST_F(ProbeMediaTest, AFormatThatABindingCannotSetIsTheReason) {
+  for (const std::uint32_t sensor : {board::kSensorA, board::kSensorB}) {
+    change([&](FakeMedia& media) { media.entities[sensor].pads[0].format = {MEDIA_BUS_FMT_SBGGR8_1X8, 0, 70000}; });
+  }
+  probe();
+  EXPECT_THAT(lines_, Contains(HasSubstr("has the format SBGGR8_1X8 of 0 x 70000, which a binding cannot set")));
+}
+
+// Without a limit, the search would try each order of the entities.
+TEST_F(ProbeMediaTest, TheSearchEndsIfEverythingIsLinkedWithEverythingAndNothingIsASensor) {
+  change([this](FakeMedia& media) {
+    media.links.clear();
+    media.entities.resize(1);
+    media.entities[0] = {"Camera", MEDIA_ENT_F_IO_V4L, board_.camera, {FakePad{}}};
+    constexpr std::uint32_t kMany = 24;
+    for (std::uint32_t i = 1; i <= kMany; ++i) {
+      media.entities.push_back({"Converter " + std::to_string(i),
+                                MEDIA_ENT_F_PROC_VIDEO_PIXEL_ENC_CONV,
+                                board_.flash,
+                                {FakePad{}, FakePad{true, {}}}});
+      for (std::uint32_t sink = 0; sink <= kMany; ++sink) {
+        if (sink != i) media.links.push_back({i, 1, sink, 0, 0});
+      }
+    }
+  });
+  probe();
+  EXPECT_THAT(lines_, Contains("    unsuitable: no sensor is upstream of it"));
+}
+
 TEST_F(ProbeMediaTest, APathThatDoesNotFitTogetherIsUnsuitableWithTheReason) {
   change([](FakeMedia& media) { media.entities[board::kScaler].pads[0].codes = {MEDIA_BUS_FMT_UYVY8_1X16}; });
   probe();

@@ -69,6 +69,16 @@ class ProbeTest : public ::testing::Test {
   Binding binding_;  // the last suggestion
 };
 
+// Drivers cut names at the end of their field, also within a character.
+TEST_F(ProbeTest, ATextThatIsCutWithinACharacterIsNotInTheBinding) {
+  FakeNode camera = fakeCamera("fake:0");
+  camera.card = "Kamera gr\xC3";
+  kernel_->add(0, camera);
+  probe();
+  ASSERT_EQ(binding_.cameras.size(), 1U);
+  EXPECT_EQ(binding_.cameras[0].node, (VideoNodeMatch{"fake", {}, "fake:0"}));
+}
+
 TEST_F(ProbeTest, TellsOfAMachineWithNothing) {
   EXPECT_THAT(lines(),
               ElementsAre("Cameras", HasSubstr("none: no driver offers a video node"), "HID devices",

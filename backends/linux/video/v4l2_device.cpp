@@ -15,6 +15,8 @@ namespace {
 
 // Drivers list some hundreds of controls or formats at most; the limit stops one that never ends its list.
 constexpr std::uint32_t kMaxItems = 4096;
+// The same for the sizes and intervals of all formats.
+constexpr std::uint32_t kMaxModes = 65536;
 
 // The four characters of a pixel format, and "-BE" for a big-endian one.
 std::string fourccText(std::uint32_t fourcc) {
@@ -172,6 +174,7 @@ bool V4l2Device::lockExclusive(DiagnosticErrorPtr* error) {
 std::vector<VideoFormat> V4l2Device::formats(std::uint32_t mediaBusCode) const {
   std::vector<VideoFormat> formats;
   const bool isCamera = kind() == VideoNodeKind::kCamera;
+  std::uint32_t left = kMaxModes;
   for (std::uint32_t index = 0; index < kMaxItems; ++index) {
     v4l2_fmtdesc description{};
     description.index = index;
@@ -179,15 +182,15 @@ std::vector<VideoFormat> V4l2Device::formats(std::uint32_t mediaBusCode) const {
     description.mbus_code = mediaBusCode;
     if (call(VIDIOC_ENUM_FMT, &description) != 0) break;
     VideoFormat format{index, fourccText(description.pixelformat), fixedText(description.description), {}};
-    if (isCamera) format.sizes = sizesOf(description.pixelformat);
+    if (isCamera) format.sizes = sizesOf(description.pixelformat, left);
     formats.push_back(std::move(format));
   }
   return formats;
 }
 
-std::vector<FrameSize> V4l2Device::sizesOf(std::uint32_t fourcc) const {
+std::vector<FrameSize> V4l2Device::sizesOf(std::uint32_t fourcc, std::uint32_t& left) const {
   std::vector<FrameSize> sizes;
-  for (std::uint32_t index = 0; index < kMaxItems; ++index) {
+  for (std::uint32_t index = 0; left > 0; ++index, --left) {
     v4l2_frmsizeenum entry{};
     entry.index = index;
     entry.pixel_format = fourcc;
@@ -198,16 +201,16 @@ std::vector<FrameSize> V4l2Device::sizesOf(std::uint32_t fourcc) const {
     size.height = discrete ? entry.discrete.height : entry.stepwise.min_height;
     size.maximumWidth = discrete ? size.width : entry.stepwise.max_width;
     size.maximumHeight = discrete ? size.height : entry.stepwise.max_height;
-    listIntervals(fourcc, size);
+    listIntervals(fourcc, size, left);
     sizes.push_back(std::move(size));
-    if (!discrete) break;  // otherwise the range is the only entry
+    if (!discrete || left == 0) break;  // a range is the only entry
   }
   return sizes;
 }
 
 // For a range of sizes, lists the intervals of the smallest size.
-void V4l2Device::listIntervals(std::uint32_t fourcc, FrameSize& size) const {
-  for (std::uint32_t index = 0; index < kMaxItems; ++index) {
+void V4l2Device::listIntervals(std::uint32_t fourcc, FrameSize& size, std::uint32_t& left) const {
+  for (std::uint32_t index = 0; left > 0; ++index, --left) {
     v4l2_frmivalenum entry{};
     entry.index = index;
     entry.pixel_format = fourcc;
@@ -315,6 +318,7 @@ void V4l2Device::listControls() {
     const int result = query(last | V4L2_CTRL_FLAG_NEXT_CTRL, &found);
     if (result == EINVAL || result == ENOTTY) return;
     if (result == 0) {
+      if (found.id <= last) return;  // the driver would repeat its list
       add(found);
       last = found.id;
       continue;

@@ -127,8 +127,8 @@ class V4l2Device final {
   void add(const v4l2_query_ext_ctrl& query);
   std::optional<std::uint32_t> nextExistingControl(std::uint32_t last) const;
   std::optional<std::uint32_t> pixelFormatOf(const VideoMode& mode, DiagnosticErrorPtr* error) const;
-  std::vector<FrameSize> sizesOf(std::uint32_t fourcc) const;
-  void listIntervals(std::uint32_t fourcc, FrameSize& size) const;
+  std::vector<FrameSize> sizesOf(std::uint32_t fourcc, std::uint32_t& left) const;
+  void listIntervals(std::uint32_t fourcc, FrameSize& size, std::uint32_t& left) const;
 
   const std::shared_ptr<V4l2Api> kernel_;
   const std::string path_;
@@ -138,11 +138,12 @@ class V4l2Device final {
   std::vector<UndescribedControl> undescribed_;
 };
 
-// The text of a fixed-size kernel field, which has no null if it is full.
+// The text of a fixed-size kernel field. Its last character is the null, even if a driver forgets it: a binding has room
+// for no more.
 template <class Character, std::size_t kSize>
 std::string fixedText(const Character (&field)[kSize]) {
   const auto* const text = reinterpret_cast<const char*>(field);
-  return std::string(text, std::find(text, text + kSize, '\0'));
+  return std::string(text, std::find(text, text + kSize - 1, '\0'));
 }
 
 // True if the value is in the control's range; buttons and bit masks have none.

@@ -52,6 +52,56 @@ TEST(VideoNodesTest, ANodeIsOpenedForQueriesOnceUnlessItWasReplacedOrUnusable) {
   EXPECT_EQ(nodes.at(0).busInfo, "fake:7");
 }
 
+// So it is at most as long as a text of a binding.
+TEST(VideoNodesTest, ATextWithoutItsEndLosesItsLastCharacter) {
+  const Kernel kernel = std::make_shared<FakeV4l2Api>();
+  FakeNode camera = fakeCamera(std::string(40, 'b'));
+  camera.driver = std::string(40, 'd');
+  camera.card = std::string(40, 'c');
+  kernel->add(0, camera);
+  const V4l2DeviceInfo node = videoNodes(kernel, kernel->roots()).at(0);
+  EXPECT_EQ(node.driver, std::string(15, 'd'));
+  EXPECT_EQ(node.card, std::string(31, 'c'));
+  EXPECT_EQ(node.busInfo, std::string(31, 'b'));
+}
+
+TEST(VideoNodesTest, ADriverThatRepeatsAControlEndsItsList) {
+  const Kernel kernel = std::make_shared<FakeV4l2Api>();
+  FakeNode camera = fakeCamera("fake:0");
+  camera.controls = {{V4L2_CID_BRIGHTNESS, "Brightness"}, {V4L2_CID_CONTRAST, "Contrast"}};
+  const std::string path = kernel->add(0, camera);
+  kernel->afterCall = [](unsigned long request, void* argument) {
+    if (request == VIDIOC_QUERY_EXT_CTRL) static_cast<v4l2_query_ext_ctrl*>(argument)->id = V4L2_CID_BRIGHTNESS;
+  };
+  const auto device = V4l2Device::open(kernel, path, nullptr);
+  ASSERT_NE(device, nullptr);
+  EXPECT_EQ(device->controls().size(), 1U);
+}
+
+TEST(VideoNodesTest, ADriverThatNeverEndsItsListsIsAskedALimitedNumberOfTimes) {
+  constexpr std::size_t kMany = 200'000;
+  class Endless final : public FakeV4l2Api {
+   public:
+    int ioctl(int descriptor, unsigned long request, void* argument) override {
+      const bool isList =
+          request == VIDIOC_ENUM_FMT || request == VIDIOC_ENUM_FRAMESIZES || request == VIDIOC_ENUM_FRAMEINTERVALS;
+      if (!isList || calls == kMany) return FakeV4l2Api::ioctl(descriptor, request, argument);
+      ++calls;
+      if (request == VIDIOC_ENUM_FRAMESIZES)
+        static_cast<v4l2_frmsizeenum*>(argument)->type = V4L2_FRMSIZE_TYPE_DISCRETE;
+      if (request != VIDIOC_ENUM_FRAMEINTERVALS) return 0;
+      static_cast<v4l2_frmivalenum*>(argument)->type = V4L2_FRMIVAL_TYPE_DISCRETE;
+      return 0;
+    }
+    std::size_t calls = 0;
+  };
+  const auto kernel = std::make_shared<Endless>();
+  const auto device = V4l2Device::open(kernel, kernel->add(0, fakeCamera("fake:0")), nullptr);
+  ASSERT_NE(device, nullptr);
+  EXPECT_FALSE(device->formats().empty());
+  EXPECT_LT(kernel->calls, kMany);
+}
+
 TEST(VideoNodesTest, ANodeThatWasReplacedBeforeItIsOpenedIsRefused) {
   const Kernel kernel = std::make_shared<FakeV4l2Api>();
   const std::string path = kernel->add(0, fakeCamera("fake:0"));
