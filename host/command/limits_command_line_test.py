@@ -120,7 +120,7 @@ class LimitsTest(CommandLineTest):
         """Neither in the run nor in an analysis of its record, in which these diagnostics have no result."""
         back, front = "CameraSyncDiagnostic.Back", "CameraSyncDiagnostic.Front"
         record, again = self.directory / "record.jsonl", self.directory / "again.jsonl"
-        ways = {"skipped": ((f"{front}=no room", "healthy"), front, {"skip"}, 0),
+        ways = {"skipped": ((f"{front}=no room", "healthy"), front, {"skip"}, 2),
                 "error": ((f"{front}x*=none", "camera_sync/port_missing_in_group"), back, {"error"}, 2)}
         for way, ((skip, phone), without, verdicts, code) in ways.items():
             for where in ("command line", "profile"):
