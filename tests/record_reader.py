@@ -6,7 +6,7 @@ import report_limits
 from report_readers import Error, Limit, Result, number
 
 RUN_KEYS = ("id", "host", "date", "program", "contract", "plugins", "phone", "seed", "tags", "attempts", "repetitions",
-            "acceptFlaky")
+            "acceptFlaky", "analyzed")
 
 
 def exact(text):
@@ -88,6 +88,8 @@ class Reader:
         self.run = {key: event[key] for key in RUN_KEYS if key in event}
         self.run["tags"] = {exact(key): exact(value) for key, value in event["tags"]}
         self.run |= {key: exact(event[key]) for key in ("id", "host", "program", "phone")}
+        if "analyzed" in self.run:
+            self.run["analyzed"] = {key: exact(value) for key, value in self.run["analyzed"].items()}
         self.run["plugins"] = list(map(exact, event["plugins"]))
         self.limits = [report_limits.Check(exact(one["limit"]), exact(one.get("name", "")), one["severity"],
                                            exact(one["source"]), None) for one in event["limits"]]

@@ -140,6 +140,10 @@ class Generator {
     }
     if (oneIn(4)) sample.run.attempts = 2 + upTo(2);
     if (oneIn(4)) sample.run.repetitions = 2 + upTo(2);
+    if (!sample.run.ofExperiments && oneIn(4)) {
+      sample.run.analyzed =
+          AnalyzedRun{oneIn(4) ? "" : std::to_string(random_()), advance(), std::string(oneOf(kWords))};
+    }
     sample.run.acceptFlaky = sample.run.attempts > 0 && oneIn(2);
     for (std::size_t i = upTo(4); i > 0; --i) sample.run.names.push_back(name(i));
     resultNames_ = {patternless(name(1001)), patternless(name(1002)), patternless(name(1003))};

@@ -36,7 +36,7 @@ SIGNS = ("]]>", "\ufffd", "\uffff", "\\u0000", "\\r", "\u2028", ",")  # as in JS
 KINDS = {"a diagnostic: pass", "a diagnostic: fail", "a diagnostic: error", "a diagnostic: skip", "an experiment: pass",
          "an experiment: error", "an experiment: skip", "a skip: no-such-hardware", "a skip: not-allowed",
          "a skip: not-reached", "a run with tags", "a run with a serial number", "a run with repetitions", "a flaky diagnostic",
-         "an error that was accepted", "a result that varied", "an interrupted run without a record", "an interrupted run with a record", "a run that never began",
+         "an error that was accepted", "an analysis of a record", "a result that varied", "an interrupted run without a record", "an interrupted run with a record", "a run that never began",
          "no results", "many results", "a deep error", "a value that is not finite", "a limit without bounds",
          "a result: pass", "a result: fail", "a result: error", "a result: none",
          *(f"a {kind}, {severity}: {verdict}" for kind in ("number", "interval", "relation")
@@ -117,6 +117,21 @@ def failure_lines(records):
         yield text + (f" ({times} times, first in {trial})" if times > 1 else f" ({trial})" if trial else "")
 
 
+def text_begin(run):
+    """The lines that say which run it was."""
+    def line(what, one):
+        return (what + (f"{one['id']}, " if one["id"] else "") +
+                f"{one['date']}, on {report_readers.printable(one['host']) or 'an unknown machine'}")
+
+    analyzed = run.get("analyzed")
+    tags = "".join(f", {report_readers.printable(key)}={report_readers.printable(value)}"
+                   for key, value in run["tags"].items())
+    where = f"{report_readers.printable(run['phone'])}, seed {run['seed']}{tags}"
+    if analyzed:
+        return [line("Analysis ", run), line("of run   ", analyzed), f"Phone    {where}"]
+    return [line("Run   ", run), f"Phone {where}"]
+
+
 def text_end(records, of_experiments, interrupted, run, never_began):
     """The lines after the records of a text and after the table of what varied."""
     if len(records) != 1 or interrupted is not None:
@@ -125,8 +140,10 @@ def text_end(records, of_experiments, interrupted, run, never_began):
         yield "A pass after an error counts as an error, unless --accept-flaky is given."
     if not of_experiments:
         yield from failure_lines(records)
-    if interrupted:
-        yield f"Interrupted while {report_readers.printable(interrupted)} was running."
+    if interrupted or (interrupted == "" and "analyzed" in run):
+        running = report_readers.printable(interrupted) or f"no {'experiment' if of_experiments else 'diagnostic'}"
+        end = "The recorded run did not come to its end: it stopped while" if "analyzed" in run else "Interrupted while"
+        yield f"{end} {running} was running."
 
 
 def run_verdict(records, accepts_flaky):
@@ -195,7 +212,10 @@ class Comparison:
         never_began = sum(one.end["status"] == "SKIP" for one in streams[len(records):])
         end = list(text_end(records, of_experiments, interrupted, run, never_began))
         varies = any(one["varying"] for one in json.loads(reports["json"]).get("variation", []))
-        self.compare_text(name, report_readers.Lines(reports["text"]), of_experiments, records, varies, end)
+        lines = report_readers.Lines(reports["text"])
+        begin = [line.decode("utf-8", "replace") for line in lines.block()]
+        self.check(f"{name} text: begin", blurred(begin), blurred(text_begin(run)))
+        self.compare_text(name, lines, of_experiments, records, varies, end)
 
     @staticmethod
     def is_superseded(records, place):
@@ -266,12 +286,21 @@ class Comparison:
     def check_identity(self, name, run, streams, suites):
         self.kinds["a run with tags"] += len(run["tags"]) > 1
         self.kinds["a run with a serial number"] += "serial" in run["tags"]
+        analyzed = run.get("analyzed")
+        self.kinds["an analysis of a record"] += analyzed is not None
         for suite in suites:
             found = report_readers.properties_of(suite)
+            of_record = {key: found.get(f"analyzed.{key}", "") for key in ("run", "date", "host")}
+            self.check(f"{name} junit: analyzed", of_record, {"run": analyzed["id"] if analyzed else "",
+                                                             **{key: analyzed[key] if analyzed else ""
+                                                                for key in ("date", "host")}})
             tags = {key[len("tag."):]: value for key, value in found.items() if key.startswith("tag.")}
             self.check(f"{name} junit: run", (found["run"], found["host"], tags), (run["id"], run["host"], run["tags"]))
         for stream in streams:
             found = stream.start["metadata"]
+            of_record = found.get("analyzed")
+            self.check(f"{name} ocp: analyzed", of_record and {"run": "", "host": ""} | of_record,
+                       analyzed and {"run": analyzed["id"], "date": analyzed["date"], "host": analyzed["host"]})
             self.check(f"{name} ocp: run", (found["run"], found["host"], found.get("tags", {})),
                        (run["id"], run["host"], run["tags"]))
             serials = [one["serialNumber"] for one in stream.start["dutInfo"].get("hardwareInfos", [])]
@@ -283,7 +312,9 @@ class Comparison:
         seeds = []
         cells = {"run": run["id"], "date": run["date"], "host": run["host"], "program": run["program"],
                  "contract": str(run["contract"]), "plugins": "; ".join(run["plugins"]), "phone": run["phone"],
-                 "seed": None, **{f"tag.{key}": value for key, value in run["tags"].items()}}
+                 "seed": None, **({f"analyzed{word}": run["analyzed"][key] for word, key in
+                                   (("Run", "id"), ("Date", "date"), ("Host", "host"))} if "analyzed" in run else {}),
+                 **{f"tag.{key}": value for key, value in run["tags"].items()}}
         for place, row in enumerate(rows):
             found = dict(zip(cells, row[-len(cells):]))
             if place:

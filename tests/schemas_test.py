@@ -144,6 +144,8 @@ def main():
             check.counts["reports"] += 1
             document = json.loads(report)
             document["run"]["id"] = f"{number:032x}"  # a random text in the samples
+            if "analyzed" in document["run"]:
+                document["run"]["analyzed"]["id"] = f"{number:032x}"
             check.valid("report", f"random run {number}", document)
     events = set(check.validators["record"].schema["properties"]["event"]["enum"])
     if check.kinds != events:

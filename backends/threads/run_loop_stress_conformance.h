@@ -7,6 +7,7 @@
 #pragma once
 
 #include "platform/run_loop.h"
+#include "tests/support/effort.h"
 
 #include <gtest/gtest.h>
 
@@ -14,7 +15,6 @@
 #include <atomic>
 #include <chrono>
 #include <cstddef>
-#include <cstdlib>
 #include <functional>
 #include <iostream>
 #include <memory>
@@ -31,7 +31,6 @@ class RunLoopStress : public ::testing::Test {
   static constexpr std::string_view kMode = kRunLoopDefaultMode;
   static constexpr std::chrono::seconds kLong{60};
 
-  static bool isThorough() { return std::getenv("QUAZOR_THOROUGH") != nullptr; }
   static RunLoop& currentLoop() { return UnderTest().loop(); }
 };
 
@@ -82,7 +81,7 @@ class StressHelper {
 // In each round other threads, started together with a run, signal it, stop it or both.
 TYPED_TEST_P(RunLoopStress, NoSignalAndNoStopIsLostHoweverItMeetsTheWaitOrTheEndOfARun) {
   enum class Race { kStop, kSignal, kBothAgainstTheLimit };
-  const int rounds = TestFixture::isThorough() ? 1'000'000 : 20'000;
+  const int rounds = isThorough() ? 1'000'000 : 20'000;
   RunLoop& loop = TestFixture::currentLoop();
   int message = 0;  // passed from the signaller to the handler, synchronised only by the loop
   int handled = 0;
@@ -128,7 +127,7 @@ TYPED_TEST_P(RunLoopStress, NoSignalAndNoStopIsLostHoweverItMeetsTheWaitOrTheEnd
 }
 
 TYPED_TEST_P(RunLoopStress, AStopMayEndTheThreadAndItsLoop) {
-  const int rounds = TestFixture::isThorough() ? 10'000 : 500;
+  const int rounds = isThorough() ? 10'000 : 500;
   std::minstd_rand random(4);
   for (int round = 0; round < rounds; ++round) {
     std::atomic<RunLoop*> running = nullptr;
@@ -152,7 +151,7 @@ TYPED_TEST_P(RunLoopStress, AStopMayEndTheThreadAndItsLoop) {
 
 TYPED_TEST_P(RunLoopStress, WhatSeveralThreadsSignalIsHandledAfterTheLastSignalOfEach) {
   constexpr std::size_t kThreads = 4;
-  const int signals = TestFixture::isThorough() ? 200'000 : 5'000;
+  const int signals = isThorough() ? 200'000 : 5'000;
   RunLoop& loop = TestFixture::currentLoop();
   std::array<std::atomic<int>, kThreads> sent{};
   std::size_t complete = 0;

@@ -302,7 +302,9 @@ Options optionsOf(const CLI::App& command, const RawOptions& raw) {
   options.logLimit = logLimitOf(raw.logLimit);
   if (command.get_option_no_throw("--trace") != nullptr) options.trace = traceOf(raw.trace);
   options.systemLog = raw.systemLog;
-  if (command.get_option_no_throw("--tag") != nullptr) options.tags = tagsOf(raw.tags);
+  if (command.get_option_no_throw("--tag") != nullptr) {
+    options.tags = tagsOf(raw.tags, options.command != Command::kAnalyze);  // those of the record are kept
+  }
   options.report = reportOf(raw, writesSeveralFormats(options.command));
   options.report.exitRules.allowSkips = options.choice.allowSkips;
   options.report.text.verbose = raw.verbose;

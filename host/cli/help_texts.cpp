@@ -59,7 +59,7 @@ constexpr ExitCodeHelp kExitCodes[] = {
     {1, "a result was outside its limits", "run analyze"},
     {1, "a problem was found", "verify diff selftest"},
     {2, "a diagnostic or experiment ended in an error", "run experiment analyze describe"},
-    {3, "a record is incomplete, because its run did not end", "verify"},
+    {3, "a record is incomplete, because its run did not end", "verify analyze"},
     {64, "the command line is invalid", {}},
     {66, "a plug-in, scenario, binding, profile or record cannot be read or loaded",
      "list describe run experiment verify analyze diff explain doctor selftest phone new"},
@@ -110,7 +110,7 @@ std::string helpFooter() {
   add(1, "a result was outside its limits, or verify, diff or selftest found a problem");
   for (const ExitCodeHelp& one : kExitCodes) {
     if (one.code < 2) continue;
-    add(one.code, one.code == 3 ? "verify: a record is incomplete, because its run did not end" : one.meaning);
+    add(one.code, one.code == 3 ? "verify, analyze: a record is incomplete, because its run did not end" : one.meaning);
   }
   return footerOf(examples, codes);
 }

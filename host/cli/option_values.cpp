@@ -109,8 +109,8 @@ UserLimit limitOfCommandLine(const std::string& text) {
   }
 }
 
-OrderedMap<std::string> tagsOf(const std::vector<std::string>& texts) {
-  const char* const variable = std::getenv(kTagsVariable);
+OrderedMap<std::string> tagsOf(const std::vector<std::string>& texts, bool withEnvironment) {
+  const char* const variable = withEnvironment ? std::getenv(kTagsVariable) : nullptr;
   std::istringstream words(variable == nullptr ? "" : variable);
   std::vector<std::string> ofEnvironment;
   for (std::string word; words >> word;) ofEnvironment.push_back(word);

@@ -38,7 +38,7 @@ UserLimit limitOfCommandLine(const std::string& text);
 
 // The tags of the environment and of `--tag KEY=VALUE`, which replace those of the environment. Throws a CommandError
 // (kUsage) for a text without that form, with an empty key or value, a key twice in one source, control characters,
-// invalid UTF-8 or more than 256 bytes.
-OrderedMap<std::string> tagsOf(const std::vector<std::string>& texts);
+// invalid UTF-8 or more than 256 bytes. Without the environment, only those of `--tag`.
+OrderedMap<std::string> tagsOf(const std::vector<std::string>& texts, bool withEnvironment = true);
 
 }  // namespace quazor

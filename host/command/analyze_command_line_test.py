@@ -1,8 +1,10 @@
 """Records analyzed again: with new parameters, by somebody else, and from earlier versions."""
 
+import csv
 import json
 import os
 import unittest
+from xml.etree import ElementTree
 
 from command_line_fixture import EXPERIMENTS, WORKING, RecordTest, analyze, events_in, quazor
 
@@ -159,6 +161,110 @@ class EarlierRecordTest(RecordTest):
         self.assert_verifies(failing)
         result = quazor("diff", failing, self.record)
         self.assertEqual((result.returncode, result.stdout), (0, "The records do not differ.\n"))
+
+
+class IdentityOfRecordTest(RecordTest):
+    """An analysis says whose phone and which run was recorded."""
+
+    def setUp(self):
+        super().setUp()
+        self.recorded("--set", "measured=90", "--set", "minimum=90", "--tag", "serial=C02X", "--tag", "station=S3",
+                      names=["Fake.One"])
+        self.began = events_in(self.record)[0]
+
+    def test_every_format_has_the_recorded_run_and_its_tags(self):
+        files = {form: self.directory / form for form in ("text", "json", "csv", "ocp", "junit")}
+        again = self.directory / "again.jsonl"
+        outputs = [word for form, file in files.items() for word in ("--output", f"{form}:{file}")]
+        result = analyze(self.record, *outputs, "--tag", "station=S5", "--record", again,
+                         env={"QUAZOR_TAGS": "serial=other bench=7"})
+        self.assertEqual(result.returncode, 0, result.stderr)
+        run, date, host = (self.began[key] for key in ("id", "date", "host"))
+        began = events_in(again)[0]
+        self.assertEqual(began["analyzed"], {"id": run, "date": date, "host": host})
+        self.assertEqual(began["tags"], [["serial", "C02X"], ["station", "S5"]])
+        text = (f"Analysis {began['id']}, {began['date']}, on {began['host']}\nof run   {run}, {date}, on {host}\n"
+                f"Phone    {began['phone']}, seed 0, serial=C02X, station=S5\n\nPASS  Fake.One")
+        self.assertTrue(result.stdout.startswith(text), result.stdout)
+        self.assertTrue(files["text"].read_text().startswith(text))
+        of_json = json.loads(files["json"].read_text())["run"]
+        self.assertEqual(of_json["analyzed"], {"id": run, "date": date, "host": host})
+        self.assertEqual(of_json["tags"], {"serial": "C02X", "station": "S5"})
+        row = next(csv.DictReader(files["csv"].read_text().splitlines()))
+        self.assertEqual((row["analyzedRun"], row["analyzedDate"], row["analyzedHost"], row["tag.serial"]),
+                         (run, date, host, "C02X"))
+        properties = {one.get("name"): one.get("value") for one in ElementTree.parse(files["junit"]).iter("property")}
+        self.assertEqual((properties["analyzed.run"], properties["analyzed.date"], properties["analyzed.host"],
+                          properties["tag.serial"]), (run, date, host, "C02X"))
+        start = next(json.loads(line)["testRunArtifact"]["testRunStart"] for line in files["ocp"].read_text().splitlines()
+                     if "testRunStart" in line)
+        self.assertEqual(start["metadata"]["analyzed"], {"run": run, "date": date, "host": host})
+        self.assertEqual(start["dutInfo"]["hardwareInfos"][0]["serialNumber"], "C02X")
+
+    def test_the_record_of_an_analysis_keeps_the_run_that_measured(self):
+        again, third = self.directory / "again.jsonl", self.directory / "third.jsonl"
+        self.assertEqual(analyze(self.record, "--record", again).returncode, 0)
+        self.assertEqual(analyze(again, "--record", third).returncode, 0)
+        self.assert_verifies(third)
+        self.assertEqual(events_in(third)[0]["analyzed"]["id"], self.began["id"])
+
+    def test_the_text_of_a_run_says_which_it_was(self):
+        text = self.run_fake("--tag", "serial=C02X", "--record", self.record, "--replace").stdout
+        began = events_in(self.record)[0]
+        self.assertTrue(text.startswith(f"Run   {began['id']}, {began['date']}, on {began['host']}\n"
+                                        f"Phone {began['phone']}, seed 0, serial=C02X\n\n"), text)
+
+
+class IncompleteRecordTest(RecordTest):
+    """Records whose run was interrupted or killed: what is missing is not green."""
+
+    def setUp(self):
+        super().setUp()
+        self.recorded("--set", "measured=90", "--set", "minimum=90", names=["Fake.*"])
+
+    def refuse_green(self, record, running, *arguments, code=3):
+        junit, again = self.directory / "junit", self.directory / "again.jsonl"
+        result = analyze(record, *arguments, "--output", f"junit:{junit}", "--record", again, "--replace")
+        self.assertEqual(result.returncode, code, result.stdout + result.stderr)
+        self.assertIn(f"the recorded run did not come to its end: it stopped while {running} was running\n", result.stderr)
+        self.assertEqual(ElementTree.parse(junit).getroot().get("errors"), "1")
+        self.assert_verifies(again)
+        return result, again
+
+    def test_an_interrupted_run(self):
+        def interrupt(events):
+            events[-1]["interrupted"] = ""
+            events[0]["names"].append("Fake.Third")
+
+        result, again = self.refuse_green(self.changed(interrupt), "no diagnostic")
+        again = again.rename(self.directory / "first_analysis.jsonl")
+        self.assertIn("2 diagnostics: 2 passed, 0 failed, 0 ended in an error, 1 not reached\n", result.stdout)
+        self.refuse_green(again, "no diagnostic")
+        self.refuse_green(again, "no diagnostic", "--set", "minimum=91", code=1)
+
+    def test_a_record_that_was_cut(self):
+        ends = [at for at, event in enumerate(events_in(self.record)) if event["event"] == "diagnosticEnded"]
+        self.refuse_green(self.changed(lambda events: events.pop()), "no diagnostic")
+        running = events_in(self.record)[ends[0] + 1]["name"]
+
+        def cut(events):
+            del events[ends[0] + 2:]
+
+        self.refuse_green(self.changed(cut), running)
+
+        def cut_between(events):
+            del events[ends[0] + 1:]
+
+        result, _ = self.refuse_green(self.changed(cut_between), "no diagnostic")
+        self.assertIn("1 diagnostic: 1 passed, 0 failed, 0 ended in an error, 1 not reached\n", result.stdout)
+
+    def test_one_whose_experiment_had_returned_a_result_is_analyzed(self):
+        def cut(events):
+            while events[-1]["event"] != "stageBegan":
+                events.pop()
+
+        result, _ = self.refuse_green(self.changed(cut), "no diagnostic")
+        self.assertIn("2 diagnostics: 2 passed", result.stdout)
 
 
 if __name__ == "__main__":

@@ -69,6 +69,13 @@ def without_identity(document):
     return changed
 
 
+def without_run(text):
+    """A text report without the lines at its beginning that say which run it was."""
+    changed, count = re.subn(r"\A(?:Run |Analysis .*\nof run ).*\nPhone .*\n\n", "", text)
+    assert count == 1, text[:500]
+    return changed
+
+
 def events_in(record):
     """The events of a record; each line must be complete."""
     text = pathlib.Path(record).read_text()

@@ -10,8 +10,10 @@
 #include "host/command/selection.h"
 #include "host/device/phone.h"
 #include "host/error/host_error.h"
+#include "host/model/incomplete_run.h"
 #include "host/model/limit_check.h"
 #include "host/model/trials.h"
+#include "host/record/record_file.h"
 #include "host/record/record_place.h"
 #include "host/run/event_pipeline.h"
 #include "host/run/isolation.h"
@@ -104,7 +106,8 @@ std::chrono::nanoseconds realSettleOf(const Options& options) {
 
 ExitCode perform(const Options& options, const Installation& installation, Console& console, RunStarted began,
                  const std::vector<Job>& jobs, const std::vector<FailedPlugin>& failed, const RunOptions& runOptions,
-                 const SeededPhoneMaker& phones, WatchedSignals* signals) {
+                 const SeededPhoneMaker& phones, WatchedSignals* signals,
+                 const std::optional<std::string>& recordedInterruption = std::nullopt) {
   const auto pipeline = beginEvents(options, installation, began, options.command == Command::kRun, console);
   EventPipeline& events = *pipeline;
   std::optional<InterruptWatcher> watcher;
@@ -127,6 +130,11 @@ ExitCode perform(const Options& options, const Installation& installation, Conso
   if (std::optional<std::string> interrupted = conductor.performAll(jobs, plan)) {
     events.onEvent(RunEnded{std::move(interrupted), dateNow()});
     return ExitCode::kInterrupted;
+  }
+  if (recordedInterruption) {
+    events.onEvent(RunEnded{recordedInterruption, dateNow()});
+    events.requireRecords();
+    return events.exitCode() == ExitCode::kAllPassed ? ExitCode::kIncomplete : events.exitCode();
   }
   for (const UserLimit& limit : limitsWithoutResult(limits, events.records())) tellLimitWithoutResult(limit, events);
   RunEnded ended{std::nullopt, dateNow()};
@@ -262,6 +270,17 @@ ResolvedParameters reboundParameters(const DiagnosticRecord& record, const Resol
   return parameters;
 }
 
+// The diagnostic in which the recorded run stopped before its end, as in RunEnded; nothing if it came to its end. One
+// whose experiment returned a result is analyzed, and so nothing of it is missing.
+std::optional<std::string> interruptionIn(const RecordedRun& run,
+                                          const std::vector<const DiagnosticRecord*>& analysable) {
+  if (run.ended && !run.ended->interrupted) return std::nullopt;
+  std::string running = run.ended ? *run.ended->interrupted : "";
+  if (!run.ended && run.isLastOpen) running = run.records.back().name;
+  const bool isAnalyzed = !analysable.empty() && analysable.back() == &run.records.back();
+  return isAnalyzed ? std::string() : running;
+}
+
 }  // namespace
 
 ExitCode analyzeCommand(const Options& given, const Installation& installation, Console& console,
@@ -315,10 +334,18 @@ ExitCode analyzeCommand(const Options& given, const Installation& installation, 
   tellLimitsForOtherValues(selection.profiles, rebound, console.err);
   began.phone = run.began.phone;
   began.seed = run.began.seed;
+  began.analyzed = run.began.analyzed.value_or(AnalyzedRun{run.began.id, run.began.date, run.began.host});
+  began.tags = run.began.tags;
+  for (const auto& [key, value] : options.tags) began.tags.set(key, value);
   began.acceptFlaky = run.began.acceptFlaky;
   began.limits = limitsOfAnalysis(run.began.limits, selection.limits);
-  return perform(options, installation, console, std::move(began), jobs, selection.failed, runOptions, nullptr,
-                 signals);
+  const std::optional<std::string> interruption = interruptionIn(run, analysable);
+  if (interruption) {
+    for (const PlannedDiagnostic& one : missingOf(run.began, run.records)) began.names.push_back(one.name);
+    if (!interruption->empty()) began.names.push_back(*interruption);
+  }
+  return perform(options, installation, console, std::move(began), jobs, selection.failed, runOptions, nullptr, signals,
+                 interruption);
 }
 
 }  // namespace quazor

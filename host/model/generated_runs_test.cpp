@@ -5,6 +5,7 @@
 #include "host/testing/test_oracle.h"
 #include "host/testing/test_phone.h"
 #include "host/testing/test_values.h"
+#include "tests/support/effort.h"
 
 #include <gtest/gtest.h>
 
@@ -175,13 +176,13 @@ class RandomScripts {
 };
 
 TEST(GeneratedRuns, HaveTheVerdictOfTheOracle) {
-  constexpr int kRuns = 10'000;
+  const int runs = roundsOf(10'000);
   RandomScripts random(1);
   RunOptions options;
   options.makePhone = [] { return std::make_unique<TestPhone>(); };
   int count[3] = {};
   int results = 0;
-  for (int i = 0; i < kRuns; ++i) {
+  for (int i = 0; i < runs; ++i) {
     const Script script = random.script();
     EventList events;
     DiagnosticStarted began = beginningOf("Scripted");
@@ -200,8 +201,8 @@ TEST(GeneratedRuns, HaveTheVerdictOfTheOracle) {
     ++count[static_cast<int>(ended.verdict)];
     results += static_cast<int>(builder.record().measuredResults.size());
   }
-  for (const int one : count) EXPECT_GT(one, kRuns / 20);
-  std::cout << kRuns << " generated runs with " << results << " results: " << count[0] << " pass, " << count[1]
+  for (const int one : count) EXPECT_GT(one, runs / 20);
+  std::cout << runs << " generated runs with " << results << " results: " << count[0] << " pass, " << count[1]
             << " fail, " << count[2] << " error\n";
 }
 

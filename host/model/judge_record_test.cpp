@@ -7,6 +7,7 @@
 #include "host/testing/test_oracle.h"
 #include "host/testing/test_records.h"
 #include "host/testing/test_values.h"
+#include "tests/support/effort.h"
 
 #include <gtest/gtest.h>
 
@@ -146,10 +147,10 @@ class RandomEvents {
 };
 
 TEST(JudgeRecord, AgreesWithTheOracleOnWhateverAPluginTells) {
-  constexpr int kSequences = 20'000;
+  const int sequences = roundsOf(20'000);
   RandomEvents random(1);
   int count[3] = {};
-  for (int i = 0; i < kSequences; ++i) {
+  for (int i = 0; i < sequences; ++i) {
     Told told;
     std::vector<RunEvent> events = random.sequence(&told);
     RecordBuilder builder;
@@ -166,18 +167,18 @@ TEST(JudgeRecord, AgreesWithTheOracleOnWhateverAPluginTells) {
     stored = stored == Verdict::kPass ? Verdict::kFail : Verdict::kPass;
     ASSERT_FALSE(problemsOf(events).empty()) << i;
   }
-  for (const int one : count) EXPECT_GT(one, kSequences / 20);
-  std::cout << kSequences << " sequences of events: " << count[0] << " pass, " << count[1] << " fail, " << count[2]
+  for (const int one : count) EXPECT_GT(one, sequences / 20);
+  std::cout << sequences << " sequences of events: " << count[0] << " pass, " << count[1] << " fail, " << count[2]
             << " error\n";
 }
 
 // Wherever it stands, a skip changes no verdict of what was run.
 TEST(JudgeRecord, TakesNothingForSkippedThatWasRun) {
-  constexpr int kSequences = 20'000;
+  const int sequences = roundsOf(20'000);
   RandomEvents random(2);
   RandomValues places(3);
   int skips = 0;
-  for (int i = 0; i < kSequences; ++i) {
+  for (int i = 0; i < sequences; ++i) {
     Told told;
     std::vector<RunEvent> events = random.sequence(&told);
     const std::size_t place = 1 + places.below(events.size());
@@ -199,7 +200,7 @@ TEST(JudgeRecord, TakesNothingForSkippedThatWasRun) {
     }
   }
   EXPECT_GT(skips, 100);
-  EXPECT_LT(skips, kSequences / 2);
+  EXPECT_LT(skips, sequences / 2);
 }
 
 }  // namespace

@@ -15,6 +15,13 @@
 
 namespace quazor {
 
+// The run whose record an analysis is of.
+struct AnalyzedRun {
+  std::string id;  // empty in records of format 1, like the host
+  Date date{};
+  std::string host;
+};
+
 // The first event: the diagnostics, plug-ins and phone of the run.
 struct RunStarted {
   std::string program;  // the version of quazor
@@ -35,6 +42,8 @@ struct RunStarted {
   std::uint64_t repetitions = 0;
   bool acceptFlaky = false;  // a pass after an error does not make the run an error
   bool traced = false;       // the frames of the cameras are told, too
+  // Only of an analysis. If its record is itself that of an analysis, this is the run that measured.
+  std::optional<AnalyzedRun> analyzed{};
 };
 
 struct DiagnosticStarted {

@@ -352,7 +352,8 @@ RecordedRun runIn(const std::filesystem::path& file) {
     if (const auto* const ended = std::get_if<RunEnded>(&event)) run.ended = *ended;
     if (std::holds_alternative<DiagnosticEnded>(event)) take();
   }
-  if (builder.isOpen()) take();
+  run.isLastOpen = builder.isOpen();
+  if (run.isLastOpen) take();
   return run;
 }
 

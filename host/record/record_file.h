@@ -96,6 +96,7 @@ struct RecordedRun {
   RunStarted began;
   std::vector<DiagnosticRecord> records;
   std::optional<RunEnded> ended;                       // nothing: the run did not end
+  bool isLastOpen = false;                             // the diagnostic of the last record did not end
   std::vector<std::vector<RecordedStream>> streams{};  // those of each of the records
 };
 

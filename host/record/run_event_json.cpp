@@ -166,6 +166,12 @@ void addCount(Json& json, const char* key, std::uint64_t count) {
   if (count > 0) json[key] = count;
 }
 
+std::optional<AnalyzedRun> analyzedAt(const Json& json, const char* key) {
+  if (!json.contains(key)) return std::nullopt;
+  const Json& run = json[key];
+  return AnalyzedRun{textAt(run, "id"), dateAt(run, "date"), textAt(run, "host")};
+}
+
 Json jsonOf(const RunStarted& event) {
   Json json = {{"event", "runBegan"},
                {"program", losslessText(event.program)},
@@ -183,6 +189,11 @@ Json jsonOf(const RunStarted& event) {
   addCount(json, "attempts", event.attempts);
   addCount(json, "repetitions", event.repetitions);
   if (event.acceptFlaky) json["acceptFlaky"] = true;
+  if (event.analyzed) {
+    json["analyzed"] = {{"id", losslessText(event.analyzed->id)},
+                        {"date", timestampText(event.analyzed->date)},
+                        {"host", losslessText(event.analyzed->host)}};
+  }
   return json;
 }
 
@@ -202,7 +213,8 @@ RunEvent readRunBegan(const Json& json) {
                     countAt(json, "attempts"),
                     countAt(json, "repetitions"),
                     json.contains("acceptFlaky") && get<bool>(json, "acceptFlaky"),
-                    json.contains("record") && json["record"] == kRecordFormatWithFrames};
+                    json.contains("record") && json["record"] == kRecordFormatWithFrames,
+                    analyzedAt(json, "analyzed")};
 }
 
 Json jsonOf(const DiagnosticStarted& event) {

@@ -8,6 +8,7 @@
 #include "host/report/junit_suite.h"
 #include "host/report/text_report.h"
 #include "host/report/variation_report.h"
+#include "host/text/timestamp.h"
 
 #include <cstddef>
 #include <cstdint>
@@ -102,6 +103,11 @@ void addRun(JUnitProperties& properties, const RunStarted& run) {
   properties.add("phone", run.phone);
   if (!run.id.empty()) properties.add("run", run.id);
   if (!run.host.empty()) properties.add("host", run.host);
+  if (run.analyzed) {
+    if (!run.analyzed->id.empty()) properties.add("analyzed.run", run.analyzed->id);
+    properties.add("analyzed.date", timestampText(run.analyzed->date));
+    if (!run.analyzed->host.empty()) properties.add("analyzed.host", run.analyzed->host);
+  }
   for (const auto& [key, value] : run.tags) properties.add("tag." + key, value);
 }
 

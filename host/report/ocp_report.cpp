@@ -9,6 +9,7 @@
 #include "host/report/run_identity.h"
 #include "host/report/text_report.h"
 #include "host/text/shell_word.h"
+#include "host/text/timestamp.h"
 
 #include <algorithm>
 #include <iterator>
@@ -94,6 +95,12 @@ Json startJson(const RunStarted& run, const std::string& name, std::string comma
   metadata["plugins"] = run.plugins;
   addText(metadata, "run", run.id);
   addText(metadata, "host", run.host);
+  if (run.analyzed) {
+    Json& analyzed = metadata["analyzed"];
+    addText(analyzed, "run", run.analyzed->id);
+    analyzed["date"] = timestampText(run.analyzed->date);
+    addText(analyzed, "host", run.analyzed->host);
+  }
   for (const auto& [key, value] : run.tags) metadata["tags"][key] = value;
   return {{"name", name},
           {"version", run.program},

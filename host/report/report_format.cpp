@@ -31,13 +31,16 @@ namespace {
 std::string textReport(const RunStarted& run, const std::vector<DiagnosticRecord>& records,
                        const std::optional<std::string>& interrupted, const TextContent& content) {
   std::ostringstream text;
+  printRun(text, run);
   for (std::size_t i = 0; i < records.size(); ++i) {
     printReport(text, run, records[i], {false, false, content.verbose});
     if (!content.verbose) printRepetitionEnd(text, records, i + 1);
   }
   printEnd(text, run, records, interrupted, content, false);
-  if (interrupted && !interrupted->empty()) {
-    text << "Interrupted while " << printable(*interrupted) << " was running.\n";
+  if (interrupted && (run.analyzed || !interrupted->empty())) {
+    std::string sentence = interruptionText(run, *interrupted);
+    sentence.front() = run.analyzed ? 'T' : 'I';
+    text << sentence << ".\n";
   }
   return text.str();
 }

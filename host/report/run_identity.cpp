@@ -1,6 +1,8 @@
 #include "host/report/run_identity.h"
 
+#include "contract/message_format.h"
 #include "host/report/csv_report.h"
+#include "host/text/table.h"
 #include "host/text/timestamp.h"
 
 #include <string_view>
@@ -31,6 +33,11 @@ std::vector<std::pair<std::string, std::string>> columnsOf(const RunStarted& run
                                                               {"plugins", textCell(plugins)},
                                                               {"phone", textCell(run.phone)},
                                                               {std::string(kSeedColumn), {}}};
+  if (run.analyzed) {
+    columns.emplace_back("analyzedRun", run.analyzed->id);
+    columns.emplace_back("analyzedDate", timestampText(run.analyzed->date));
+    columns.emplace_back("analyzedHost", textCell(run.analyzed->host));
+  }
   for (const auto& [key, value] : run.tags) columns.emplace_back("tag." + key, textCell(value));
   return columns;
 }
@@ -49,10 +56,39 @@ Json runJson(const RunStarted& run) {
                {"phone", run.phone},
                {"seed", run.seed},
                {"tags", std::move(tags)}};
+  if (run.analyzed) {
+    json["analyzed"] = {
+        {"id", run.analyzed->id}, {"date", timestampText(run.analyzed->date)}, {"host", run.analyzed->host}};
+  }
   if (run.attempts > 0) json["attempts"] = run.attempts;
   if (run.repetitions > 0) json["repetitions"] = run.repetitions;
   if (run.acceptFlaky) json["acceptFlaky"] = true;
   return json;
+}
+
+void printRun(std::ostream& out, const RunStarted& run) {
+  if (run.id.empty()) return;
+  const auto lineOf = [](std::string_view what, const std::string& id, Date date, const std::string& host) {
+    return formatMessage("%@%@%@, on %@", what, id.empty() ? "" : id + ", ", timestampText(date),
+                         host.empty() ? "an unknown machine" : printable(host));
+  };
+  if (run.analyzed) {
+    out << lineOf("Analysis ", run.id, run.date, run.host) << '\n'
+        << lineOf("of run   ", run.analyzed->id, run.analyzed->date, run.analyzed->host) << '\n';
+  } else {
+    out << lineOf("Run   ", run.id, run.date, run.host) << '\n';
+  }
+  out << (run.analyzed ? "Phone    " : "Phone ") << printable(run.phone) << ", seed " << run.seed;
+  for (const auto& [key, value] : run.tags) out << ", " << printable(key) << '=' << printable(value);
+  out << "\n\n";
+}
+
+std::string interruptionText(const RunStarted& run, const std::string& interrupted) {
+  const std::string running = !interrupted.empty() ? printable(interrupted)
+                              : run.ofExperiments  ? "no experiment"
+                                                   : "no diagnostic";
+  return (run.analyzed ? "the recorded run did not come to its end: it stopped while " : "interrupted while ") +
+         running + " was running";
 }
 
 std::string withRunColumns(const std::string& csv, const RunStarted& run, const std::vector<std::uint64_t>& seeds) {

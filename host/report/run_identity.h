@@ -6,6 +6,7 @@
 #include <nlohmann/json.hpp>
 
 #include <cstdint>
+#include <ostream>
 #include <string>
 #include <vector>
 
@@ -13,6 +14,13 @@ namespace quazor {
 
 // The member "run" of JSON reports.
 nlohmann::ordered_json runJson(const RunStarted& run);
+
+// Prints which run it was, of which phone, and an empty line; nothing for a run without an ID. Of an analysis, also the
+// run whose record it is of.
+void printRun(std::ostream& out, const RunStarted& run);
+
+// That the run was interrupted, or of an analysis that the recorded run was: "interrupted while A was running".
+std::string interruptionText(const RunStarted& run, const std::string& interrupted);
 
 // Appends columns for the run to every line of a CSV table. The seed of a line is that of its own entry, `seeds`, which
 // has one for each line after the header.

@@ -2,6 +2,7 @@
 
 #include "backends/log/standard_error_log.h"
 #include "contract/message_format.h"
+#include "host/report/run_identity.h"
 #include "host/report/text_report.h"
 #include "host/report/variation_report.h"
 #include "host/system/output_file.h"
@@ -36,6 +37,7 @@ RunReport::RunReport(ReportOptions options, Console& console)
 void RunReport::onEvent(const RunEvent& event) {
   if (const auto* const began = std::get_if<RunStarted>(&event)) {
     run_ = *began;
+    if (options_.output.empty() && options_.format == Format::kText) printRun(console_.out, run_);
   } else if (const auto* const diagnostic = std::get_if<DiagnosticStarted>(&event)) {
     const auto place = std::find(run_.names.begin(), run_.names.end(), diagnostic->name);
     number_ = static_cast<std::size_t>(place - run_.names.begin()) + 1;
@@ -119,13 +121,7 @@ void RunReport::finishRun(const RunEnded& event) {
     writeUnfolded(console_.out, reportText(options_.format, run_, records_, interrupted));
   }
   console_.out.flush();
-  if (interrupted && interrupted->empty()) {
-    console_.err << "quazor: interrupted while no " << (run_.ofExperiments ? "experiment" : "diagnostic")
-                 << " was running\n";
-  }
-  if (interrupted && !interrupted->empty()) {
-    console_.err << "quazor: interrupted while " << printable(*interrupted) << " was running\n";
-  }
+  if (interrupted) console_.err << "quazor: " << interruptionText(run_, *interrupted) << '\n';
   if (!console_.out) {
     console_.err << "quazor: standard output cannot be written\n";
     allWritten_ = false;

@@ -11,6 +11,7 @@
 #include "host/testing/test_plugins.h"
 #include "host/testing/test_signals.h"
 #include "host/testing/test_values.h"
+#include "tests/support/effort.h"
 
 #include <gmock/gmock.h>
 #include <gtest/gtest.h>
@@ -28,12 +29,6 @@ using testing::ElementsAre;
 using testing::EndsWith;
 using testing::HasSubstr;
 using testing::IsEmpty;
-
-#if defined(QUAZOR_ADDRESS_SANITIZER) || defined(QUAZOR_THREAD_SANITIZER)
-constexpr bool kHasSanitizer = true;
-#else
-constexpr bool kHasSanitizer = false;
-#endif
 
 class IsolationTest : public testing::Test {
  protected:

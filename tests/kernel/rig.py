@@ -203,6 +203,9 @@ def main():
         return shell(options.shell, directory, kernel)
     say(f"{kernel.name}; {time.monotonic() - began:.1f} s until here")
     steps = chosen_steps(options.steps, options.thorough)
+    if not options.steps and len(steps) < len(STEPS):
+        left_out = ", ".join(step.name for step in STEPS if step not in steps)
+        say(f"left out: {left_out} (--thorough runs them)")
     system = system_archive(kernel)
     if any(step.needs_vimc for step in steps):
         system += module_archive(find_vimc(kernel, say))

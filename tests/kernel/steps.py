@@ -18,7 +18,7 @@ class Step:
     limit: int = 60  # seconds of guest time before it counts as hung
     soak: bool = False  # with sanitizers only when it is named: it takes minutes there
     thorough: bool = False  # only with --thorough, or when it is named
-    needs_vimc: bool = False
+    needs_vimc: bool = False  # a module that is built once, of 140 MB of sources
 
 
 STEPS = [
@@ -50,7 +50,7 @@ STEPS = [
     Step("sensor_faults", "no sensor, two, silent, refusing, removed, pausing, with long reports",
          sensors.sensor_faults, boot=2),
     Step("media_controller", "frames of vimc come through links and pads of the binding", cameras.media_controller,
-         boot=2, needs_vimc=True),
+         boot=2, thorough=True, needs_vimc=True),
     Step("display_off", "no images while the display is dark or unplugged", sensors.display_off, boot=2),
     Step("usb_camera", "a USB camera passes as probed; its frames are as the kernel counts them", usb.usb_camera, boot=3),
     Step("usb_cameras", "five USB cameras pass as probed, to the frame", usb.usb_cameras, boot=3),

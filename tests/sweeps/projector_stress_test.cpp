@@ -3,6 +3,7 @@
 #include "backends/threads/real_clock.h"
 #include "backends/threads/thread_concurrency.h"
 #include "diagnostics/projector_fault/tessel_fault_experiment.h"
+#include "tests/support/effort.h"
 #include "tests/support/fake_camera.h"
 
 #include <gtest/gtest.h>
@@ -12,7 +13,6 @@
 #include <chrono>
 #include <cstddef>
 #include <cstdint>
-#include <cstdlib>
 #include <iostream>
 #include <map>
 #include <memory>
@@ -182,7 +182,7 @@ class ProjectorStress : public testing::Test {
 };
 
 TEST_F(ProjectorStress, EndsOnceHoweverItsEndsMeet) {
-  const int rounds = std::getenv("QUAZOR_THOROUGH") != nullptr ? 10'000 : 1'000;
+  const int rounds = isThorough() ? 10'000 : 1'000;
   std::minstd_rand random(1);
   for (int i = 0; i < rounds; ++i) {
     run(drawRound(random));

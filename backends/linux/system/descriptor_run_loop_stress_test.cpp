@@ -1,6 +1,7 @@
 #include "backends/linux/system/descriptor_run_loop.h"
 
 #include "backends/threads/run_loop_stress_conformance.h"
+#include "tests/support/effort.h"
 
 #include <sys/socket.h>
 
@@ -18,7 +19,7 @@ INSTANTIATE_TYPED_TEST_SUITE_P(Descriptors, RunLoopStress, DescriptorLoops);
 
 // Two threads send at random times, in different ways. Nothing may be lost, and the loop must not hang.
 TEST(DescriptorRunLoopStressTest, NeitherSignalsNorBytesAreLost) {
-  const int rounds = std::getenv("QUAZOR_THOROUGH") != nullptr ? 500'000 : 20'000;
+  const int rounds = isThorough() ? 500'000 : 20'000;
   RunLoop& loop = DescriptorLoops().loop();
   std::array<int, 2> ends{};
   ASSERT_EQ(::socketpair(AF_UNIX, SOCK_STREAM | SOCK_CLOEXEC | SOCK_NONBLOCK, 0, ends.data()), 0);
