@@ -140,6 +140,8 @@ def text_end(records, of_experiments, interrupted, run, never_began):
         yield "A pass after an error counts as an error, unless --accept-flaky is given."
     if not of_experiments:
         yield from failure_lines(records)
+    if interrupted is None and run_verdict(records, run.get("acceptFlaky")) == "skip":
+        yield "What was skipped makes the exit code 2, unless --allow-skips is given."
     if interrupted or (interrupted == "" and "analyzed" in run):
         running = report_readers.printable(interrupted) or f"no {'experiment' if of_experiments else 'diagnostic'}"
         end = "The recorded run did not come to its end: it stopped while" if "analyzed" in run else "Interrupted while"
@@ -199,9 +201,17 @@ class Comparison:
             self.kinds["an error that was accepted"] += bool(accepted)
             junit = report_readers.read_superseded(suite) if accepted else report_readers.read_junit(suite)
             self.check_record(f"{where} junit", blurred(junit), blurred(report_readers.expected_of_junit(record)))
+            self.check(f"{where} ocp: superseded", stream.start["metadata"].get("superseded", False), bool(accepted))
             self.check(f"{where}: begin", suite.get("timestamp"), stream.begin)
             record["error stage"] = None if accepted else junit.get("error stage", "")
         self.check_unrecorded(name, streams[len(records):], suites[len(records):], records, interrupted)
+        due = "error" if interrupted is not None else run_verdict(records, run.get("acceptFlaky"))
+        code = {"pass": 0, "fail": 1, "error": 2, "skip": 2}[run_verdict(records, run.get("acceptFlaky"))]
+        if interrupted is not None:
+            code = (code or 3) if "analyzed" in run else 130
+        for suite in suites:
+            properties = report_readers.properties_of(suite)
+            self.check(f"{name} junit: run", (properties["run.verdict"], properties["run.exitCode"]), (due, str(code)))
         identity = json.loads(reports["json"])["run"]
         self.check_identity(name, identity, streams, suites)
         rows = csv_reader.csv_rows(reports["csv"])

@@ -58,7 +58,8 @@ constexpr ExitCodeHelp kExitCodes[] = {
     {0, "done", "list describe explain phone completion new"},
     {1, "a result was outside its limits", "run analyze"},
     {1, "a problem was found", "verify diff selftest"},
-    {2, "a diagnostic or experiment ended in an error", "run experiment analyze describe"},
+    {2, "a diagnostic or experiment ended in an error, or was skipped without --allow-skips", "run experiment"},
+    {2, "a diagnostic or experiment ended in an error", "analyze describe"},
     {3, "a record is incomplete, because its run did not end", "verify analyze"},
     {64, "the command line is invalid", {}},
     {66, "a plug-in, scenario, binding, profile or record cannot be read or loaded",
@@ -109,7 +110,7 @@ std::string helpFooter() {
   add(0, "all diagnostics passed, or all experiments returned a result");
   add(1, "a result was outside its limits, or verify, diff or selftest found a problem");
   for (const ExitCodeHelp& one : kExitCodes) {
-    if (one.code < 2) continue;
+    if (one.code < 2 || one.commands == "analyze describe") continue;  // told with run
     add(one.code, one.code == 3 ? "verify, analyze: a record is incomplete, because its run did not end" : one.meaning);
   }
   return footerOf(examples, codes);

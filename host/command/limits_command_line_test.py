@@ -129,6 +129,11 @@ class LimitsTest(CommandLineTest):
         self.assertEqual(done.returncode, 1, done.stdout)
         self.assertIn("the limit 'Nowhere > 0' fits no result, but this is not recorded as an error", done.stdout)
 
+    def test_a_limit_without_a_result_is_not_counted_as_a_diagnostic(self):
+        done = self.run_limited("--limit", "Nowhere > 0", "--limit", "Nobody > 0")
+        self.assertEqual(done.returncode, 2, done.stderr)
+        self.assertIn(": 1 passed, 0 failed, 0 ended in an error, 2 limits without a result\n", done.stdout)
+
     def test_failed_diagnostics_are_run_again_with_their_limits(self):
         limit = f"{self.name} < {self.value}"
         self.assertEqual(self.run_limited("--limit", limit).returncode, 1)

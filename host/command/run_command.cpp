@@ -94,6 +94,7 @@ std::unique_ptr<EventPipeline> beginEvents(Options options, const Installation& 
   outputs.systemLog = options.systemLog;
   outputs.report = options.report;
   outputs.report.text.isExplained = explainedTopics(installation.explanations());
+  outputs.report.text.allowSkips = options.choice.allowSkips;
   outputs.logLimit = options.logLimit;
   return std::make_unique<EventPipeline>(outputs, console);
 }

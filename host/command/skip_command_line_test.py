@@ -128,6 +128,24 @@ class SkipTest(RecordTest):
         self.assertIn("Fake.Two: verdict was skip and is pass", done.stdout)
         self.assertIn("Fake.Two: skip is only in the first: not-allowed: it is hot", done.stdout)
 
+    def test_the_last_line_of_the_text_says_that_a_skip_is_the_reason(self):
+        reason = "What was skipped makes the exit code 2, unless --allow-skips is given.\n"
+        done = self.run_fake(*HOT, names=BOTH)
+        self.assertEqual(done.returncode, 2, done.stderr)
+        self.assertTrue(done.stdout.endswith(reason), done.stdout)
+        self.assertNotIn(reason, self.run_fake(*HOT, "--allow-skips", names=BOTH).stdout)
+        done = self.run_fake("--skip", "Fake.*=hot", "--allow-skips", names=BOTH)
+        self.assertEqual(done.returncode, 2, done.stderr)
+        self.assertTrue(done.stdout.endswith("Nothing passed, so the exit code is 2, in spite of --allow-skips.\n"), done.stdout)
+        junit = self.directory / "junit"
+        for options, code in (((), 2), (("--allow-skips",), 0)):
+            self.assertEqual(self.run_fake(*HOT, *options, "--output", f"junit:{junit}", names=BOTH).returncode, code)
+            suites = list(xml.etree.ElementTree.parse(junit).iter("testsuite"))
+            self.assertEqual(len(suites), 2)
+            for suite in suites:
+                found = {one.get("name"): one.get("value") for one in suite.findall("properties/property")}
+                self.assertEqual((found["run.verdict"], found["run.exitCode"]), ("skip", str(code)))
+
     def test_an_experiment_can_be_skipped(self):
         done = quazor("experiment", "FakeExperiment", "--plugin", WORKING, "--phone", self.phone, "--profile", "none",
                       "--skip", "FakeExperiment=x")

@@ -170,13 +170,25 @@ JUnitSuite suiteOfUnrecorded(const RunStarted& run, const std::string& name, Dat
   return suite;
 }
 
+// Without what only the end of the program shows, such as a report that cannot be written.
+ExitCode exitCodeOfRun(const RunStarted& run, const std::vector<DiagnosticRecord>& records,
+                       const std::optional<std::string>& interrupted, const ExitRules& rules) {
+  if (interrupted && !run.analyzed) return ExitCode::kInterrupted;
+  const ExitCode code = exitCodeOf(records, rules);
+  return interrupted && code == ExitCode::kAllPassed ? ExitCode::kIncomplete : code;
+}
+
 }  // namespace
 
 std::string junitReport(const RunStarted& run, const std::vector<DiagnosticRecord>& records,
-                        const std::optional<std::string>& interrupted) {
+                        const std::optional<std::string>& interrupted, const ExitRules& rules) {
+  const std::string verdict(interrupted ? nameOf(Verdict::kError) : nameOf(runVerdictOf(records, rules.acceptFlaky)));
+  const std::string exitCode = std::to_string(static_cast<int>(exitCodeOfRun(run, records, interrupted, rules)));
   JUnitCounts counts;
   std::string suites;
-  const auto add = [&counts, &suites](const JUnitSuite& suite) {
+  const auto add = [&](JUnitSuite suite) {
+    suite.properties().add("run.verdict", verdict);
+    suite.properties().add("run.exitCode", exitCode);
     counts += suite.counts();
     suites += suite.xml();
   };

@@ -3,6 +3,7 @@
 #pragma once
 
 #include "host/model/run_event.h"
+#include "host/model/trials.h"
 
 #include <optional>
 #include <string>
@@ -16,6 +17,6 @@ namespace quazor {
 // A suite with an error has the verdict error; otherwise a suite with a failure has failed. Any other suite has passed
 // unless its test case was skipped.
 std::string junitReport(const RunStarted& run, const std::vector<DiagnosticRecord>& records,
-                        const std::optional<std::string>& interrupted);
+                        const std::optional<std::string>& interrupted, const ExitRules& rules = {});
 
 }  // namespace quazor

@@ -39,6 +39,8 @@ TEST(JUnitReport, HasASuiteForEachRecordAndACaseForEachResult) {
       <property name="contract" value="2"/>
       <property name="plugin" value="p.so"/>
       <property name="phone" value="phone.json"/>
+      <property name="run.verdict" value="pass"/>
+      <property name="run.exitCode" value="0"/>
     </properties>
     <testcase classname="Diagnostic" name="Count">
       <properties>

@@ -4,6 +4,7 @@
 #include "host/device/phone.h"
 #include "host/model/incomplete_run.h"
 #include "host/model/limit_check.h"
+#include "host/model/trials.h"
 #include "host/record/value_json.h"
 #include "host/report/ocp_stream.h"
 #include "host/report/run_identity.h"
@@ -12,6 +13,7 @@
 #include "host/text/timestamp.h"
 
 #include <algorithm>
+#include <cstddef>
 #include <iterator>
 #include <set>
 #include <string>
@@ -197,8 +199,8 @@ void addValidators(Json& measurement, const LimitCheck& check) {
 // Writes the test run of one record.
 class OcpRecordWriter {
  public:
-  OcpRecordWriter(std::string& out, const RunStarted& run, const DiagnosticRecord& record)
-      : run_(run), record_(record), stream_(out, record.log, record.begin) {}
+  OcpRecordWriter(std::string& out, const RunStarted& run, const DiagnosticRecord& record, bool isAccepted)
+      : run_(run), record_(record), isAccepted_(isAccepted), stream_(out, record.log, record.begin) {}
 
   // Returns the date of the last line.
   Date write() {
@@ -209,6 +211,7 @@ class OcpRecordWriter {
     if (record_.skip) metadata["skip"] = {{"kind", nameOf(record_.skip->kind)}, {"reason", record_.skip->reason}};
     if (record_.trial.attempt > 0) metadata["attempt"] = record_.trial.attempt;
     if (record_.trial.repetition > 0) metadata["repetition"] = record_.trial.repetition;
+    if (isAccepted_) metadata["superseded"] = true;
     RunStarted ofRecord = run_;
     ofRecord.seed = record_.seed;
     ofRecord.ofExperiments = record_.experimentOnly;
@@ -335,6 +338,7 @@ class OcpRecordWriter {
 
   const RunStarted& run_;
   const DiagnosticRecord& record_;
+  const bool isAccepted_;  // an error that does not count, because a later attempt had none
   OcpStream stream_;
   Date stepEnd_{};
   bool errorIsWritten_ = false;
@@ -346,7 +350,10 @@ std::string ocpReport(const RunStarted& run, const std::vector<DiagnosticRecord>
                       const std::optional<std::string>& interrupted) {
   std::string report;
   Date end = run.date;
-  for (const DiagnosticRecord& record : records) end = OcpRecordWriter(report, run, record).write();
+  for (std::size_t i = 0; i < records.size(); ++i) {
+    const bool isAccepted = run.acceptFlaky && isSuperseded(records, i);
+    end = OcpRecordWriter(report, run, records[i], isAccepted).write();
+  }
   const UnrecordedDiagnostics unrecorded = unrecordedDiagnosticsOf(run, records, interrupted);
   const std::vector<LogLine> noLog;
   if (unrecorded.interrupted) {

@@ -122,7 +122,7 @@ std::string reportText(Format format, const RunStarted& run, const std::vector<D
       return withRunColumns(csv, run, seeds);
     }
     case Format::kOcp: return ocpReport(run, records, interrupted);
-    case Format::kJunit: return junitReport(run, records, interrupted);
+    case Format::kJunit: return junitReport(run, records, interrupted, {text.allowSkips, run.acceptFlaky});
     case Format::kJson: break;
   }
   nlohmann::ordered_json document =
@@ -163,6 +163,11 @@ void printEnd(std::ostream& out, const RunStarted& run, const std::vector<Diagno
   if (hasFlaky && !run.acceptFlaky)
     out << "A pass after an error counts as an error, unless --accept-flaky is given.\n";
   if (!run.ofExperiments) printFailures(out, records, colour, text.isExplained);
+  const ExitRules rules{text.allowSkips, run.acceptFlaky};
+  if (interrupted || runVerdictOf(records, run.acceptFlaky) != Verdict::kSkip) return;
+  if (exitCodeOf(records, rules) == ExitCode::kAllPassed) return;
+  out << (text.allowSkips ? "Nothing passed, so the exit code is 2, in spite of --allow-skips.\n"
+                          : "What was skipped makes the exit code 2, unless --allow-skips is given.\n");
 }
 
 }  // namespace quazor

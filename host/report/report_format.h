@@ -40,9 +40,11 @@ struct TextContent {
   bool verbose = false;  // every result of a diagnostic
   // True for what `quazor explain` explains; without the function, nothing is.
   std::function<bool(const std::string& topic)> isExplained{};
+  bool allowSkips = false;  // a skipped diagnostic does not make the exit code 2
 };
 
-// The complete report of a run. `interrupted` as in RunEnded. `text` only matters for kText.
+// The complete report of a run. `interrupted` as in RunEnded. `text` only matters for kText, but
+// `allowSkips` also for kJunit.
 std::string reportText(Format format, const RunStarted& run, const std::vector<DiagnosticRecord>& records,
                        const std::optional<std::string>& interrupted, const TextContent& text = {});
 

@@ -118,7 +118,7 @@ void RunReport::finishRun(const RunEnded& event) {
     printEnd(console_.out, run_, records_, interrupted, options_.text, console_.colour);
   }
   if (!toFile && options_.format != Format::kText) {
-    writeUnfolded(console_.out, reportText(options_.format, run_, records_, interrupted));
+    writeUnfolded(console_.out, reportText(options_.format, run_, records_, interrupted, options_.text));
   }
   console_.out.flush();
   if (interrupted) console_.err << "quazor: " << interruptionText(run_, *interrupted) << '\n';

@@ -223,7 +223,9 @@ void printVerdict(std::ostream& out, const DiagnosticRecord& record, bool colour
 }
 
 void printSummary(std::ostream& out, const std::vector<DiagnosticRecord>& records, std::size_t notReached) {
-  const VerdictCounts counts = verdictCountsOf(records);
+  VerdictCounts counts = verdictCountsOf(records);
+  const auto limits = static_cast<std::size_t>(std::count_if(records.begin(), records.end(), isOfLimit));
+  counts.errors -= limits;  // they are no diagnostics
   const bool isRepeated =
       std::any_of(records.begin(), records.end(), [](const DiagnosticRecord& one) { return one.trial.repetition > 0; });
   out << countText(counts.all(), isRepeated ? "run" : "diagnostic") << ": " << count(counts.passed, "passed") << ", "
@@ -231,6 +233,7 @@ void printSummary(std::ostream& out, const std::vector<DiagnosticRecord>& record
   if (counts.skipped > 0) out << ", " << count(counts.skipped, "skipped");
   if (counts.flaky > 0) out << ", " << count(counts.flaky, "flaky");
   if (notReached > 0) out << ", " << count(notReached, "not reached");
+  if (limits > 0) out << ", " << countText(limits, "limit") << " without a result";
   if (const std::size_t warnings = warningsIn(records); warnings > 0) {
     out << ", " << count(warnings, warnings == 1 ? "warning" : "warnings");
   }
