@@ -62,6 +62,7 @@ struct Options {
   std::filesystem::path failedOf;                     // the record for --only failed; empty: that of the last run
   std::filesystem::path profile;                      // empty: the default one
   std::optional<Profile> recorded;                    // the parameters of the run that is repeated
+  std::vector<std::filesystem::path> bases;           // of profiles and phone: files that a run reads besides
   std::filesystem::path phone;                        // a scenario, or linux:BINDING; empty: the installed healthy one
   Choice choice;                                      // of what runs
   ReportOptions report;

@@ -306,6 +306,15 @@ std::vector<Explanation> parseExplanations(const std::string& file, std::string_
   return explanations;
 }
 
+std::vector<std::filesystem::path> explanationFiles(const std::vector<std::filesystem::path>& directories) {
+  std::vector<std::filesystem::path> existing = directories;
+  std::erase_if(existing, [](const std::filesystem::path& one) {
+    std::error_code ignored;
+    return !std::filesystem::is_directory(one, ignored);
+  });
+  return filesIn(existing);
+}
+
 std::vector<Explanation> readExplanations(const std::vector<std::filesystem::path>& directories) {
   std::vector<Explanation> all = explanationsIn(filesIn(directories), [](const std::string&) { return true; });
   if (all.empty()) refuse(directories.back().string(), "the directory contains none.");
@@ -314,12 +323,7 @@ std::vector<Explanation> readExplanations(const std::vector<std::filesystem::pat
 
 void addExplainedRanges(const std::vector<std::filesystem::path>& directories,
                         std::vector<DescribedDiagnostic>& diagnostics) {
-  std::vector<std::filesystem::path> existing = directories;
-  std::erase_if(existing, [](const std::filesystem::path& one) {
-    std::error_code ignored;
-    return !std::filesystem::is_directory(one, ignored);
-  });
-  const std::vector<Explanation> explanations = explanationsIn(filesIn(existing), mayHaveParameters);
+  const std::vector<Explanation> explanations = explanationsIn(explanationFiles(directories), mayHaveParameters);
   for (DescribedDiagnostic& diagnostic : diagnostics) {
     if (!diagnostic.description.isAsked || diagnostic.description.error != nullptr) continue;
     for (const Part part : kParts) {

@@ -60,9 +60,12 @@ std::string keyOf(std::string_view domain, std::int64_t code);
 // documented form.
 std::vector<Explanation> parseExplanations(const std::string& file, std::string_view text);
 
-// Reads all NAME.json files of the directories except NAME.schema.json, in the order of their names. A file hides those
-// of the same name in later directories. Throws InputError if a file cannot be read, if there are no explanations, or
-// if two explain the same thing.
+// All NAME.json files of the directories except NAME.schema.json, in the order of their names. A file hides those of
+// the same name in later directories. Directories that do not exist have none. Throws InputError if one cannot be read.
+std::vector<std::filesystem::path> explanationFiles(const std::vector<std::filesystem::path>& directories);
+
+// Reads these files. Throws InputError if a directory does not exist, a file cannot be read, there are no explanations,
+// or two explain the same thing.
 std::vector<Explanation> readExplanations(const std::vector<std::filesystem::path>& directories);
 
 // Gives the described parameters for which the plug-in gives no range that of the explanations, if there is one. Reads

@@ -116,6 +116,35 @@ class LimitsTest(CommandLineTest):
         done = quazor("analyze", record, "--plugin", WORKING, "--parameters", path)
         self.assertEqual(done.returncode, 1, done.stdout + done.stderr)
 
+    def test_a_limit_on_what_was_skipped_or_ended_in_an_error_is_not_missed(self):
+        """Neither in the run nor in an analysis of its record, in which these diagnostics have no result."""
+        back, front = "CameraSyncDiagnostic.Back", "CameraSyncDiagnostic.Front"
+        record, again = self.directory / "record.jsonl", self.directory / "again.jsonl"
+        ways = {"skipped": ((f"{front}=no room", "healthy"), front, {"skip"}, 2),
+                "error": ((f"{front}x*=none", "camera_sync/port_missing_in_group"), back, {"error"}, 2)}
+        for way, ((skip, phone), without, verdicts, code) in ways.items():
+            for where in ("command line", "profile"):
+                with self.subTest(way=way, where=where):
+                    limit = ["--limit", f"{without}:*.Total > 0"]
+                    if where == "profile":
+                        limit = ["--parameters", self.profile({without: {"limits": [{"limit": "*.Total > 0"}]}})]
+                    skips = ["--skip", skip] if way == "skipped" else []
+                    done = quazor("run", back, front, *skips, "--phone", phone, *limit, "--format", "json",
+                                  "--record", record, "--replace")
+                    self.assertEqual(done.returncode, code, done.stderr)
+                    found = {one["name"]: one["verdict"] for one in json.loads(done.stdout)["diagnostics"]}
+                    self.assertEqual(found, {back: "pass", front: "pass"} | {without: verdicts.pop()})
+                    verdicts.add(found[without])
+                    done = quazor("analyze", record, "--format", "json", "--record", again, "--replace")
+                    self.assertEqual(done.returncode, 0, done.stdout + done.stderr)
+                    self.assertEqual(len(json.loads(done.stdout)["diagnostics"]), 1)
+                    self.assertEqual(quazor("verify", record, again).returncode, 0)
+        # What is given for the analysis itself must fit, and so must a limit that fitted nothing in the run.
+        limit = f"{back}:*.Total > 0"
+        self.assertEqual(quazor("analyze", record, "--limit", limit).returncode, 2)
+        quazor("run", front, "--limit", "Nowhere:A > 0", "--record", record, "--replace")
+        self.assertEqual(quazor("analyze", record).returncode, 2)
+
     def test_an_entry_that_was_removed_is_missed(self):
         record = self.directory / "record.jsonl"
         self.run_limited("--limit", "Nowhere > 0", "--record", record, "--replace")

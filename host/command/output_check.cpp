@@ -1,5 +1,6 @@
 #include "host/command/output_check.h"
 
+#include "host/command/explanations.h"
 #include "host/device/phone.h"
 #include "host/error/exit_code.h"
 #include "host/record/previous_run.h"
@@ -51,6 +52,9 @@ std::vector<fs::path> inputsOf(const Options& options, const Installation& insta
   inputs.push_back(options.failedOf);
   // Every run reads or replaces the record of the last one.
   if (options.command == Command::kRun) inputs.push_back(previousRunFile());
+  const std::vector<fs::path> explanations = explanationFiles(installation.explanations());
+  inputs.insert(inputs.end(), explanations.begin(), explanations.end());
+  inputs.insert(inputs.end(), options.bases.begin(), options.bases.end());
   std::erase_if(inputs, [](const fs::path& file) { return file.empty(); });
   return inputs;
 }

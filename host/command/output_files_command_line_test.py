@@ -67,6 +67,36 @@ class OutputFilesTest(CommandLineTest):
                     self.assertIn(result.returncode, (64, 66), result.stdout)
                     self.assertEqual(file.read_bytes(), before)
 
+    def test_the_bases_of_the_profiles_and_of_the_phone_and_the_explanations(self):
+        def based(name, kind, base, **more):
+            file = self.directory / "quazor" / kind / name
+            file.parent.mkdir(parents=True, exist_ok=True)
+            file.write_text(json.dumps({**({"base": base} if base else {}), **more}))
+            self.before[file] = file.read_bytes()
+            return file
+
+        empty = {"schema": 1, "diagnostics": {}}
+        profiles = [based("low.json", "profiles", None, **empty), based("middle.json", "profiles", "low", **empty),
+                    based("top.json", "profiles", "middle.json", **empty)]
+        phones = [based("low.json", "scenarios", str(self.phone), title="Low"),
+                  based("middle.json", "scenarios", "low", title="Middle"),
+                  based("top.json", "scenarios", "middle.json", title="Top")]
+        explanation = {"names": ["Fake.One"], "kind": "diagnostic", "title": "A", "meaning": "B.", "causes": ["C."], "next": ["D."]}
+        files = [self.phone, *profiles, *phones, based("fake.json", "explanations", None, schema=1, names=[explanation])]
+        own = {"XDG_DATA_HOME": str(self.directory)}
+        run = ("run", "Fake.One", *PLUGIN, "--phone", "top", "--set", "duration=1")
+        for file in files:
+            for option in (["--output", file], ["--output", f"json:{file}"], ["--record", file, "--replace"]):
+                with self.subTest(option):
+                    self.assert_untouched(file, quazor(*run, "--profile", "top", *option, env=own))
+                    self.assert_untouched(file, quazor(*run, "--profile", "none", "--parameters", "top", *option, env=own)
+                                          if file in profiles else quazor(*run, *option, env=own))
+        for file in (profiles[0], files[-1]):
+            analyze = ("analyze", self.record, *PLUGIN, "--profile", "top", "--output", file)
+            self.assert_untouched(file, quazor(*analyze, env=own))
+        result = quazor(*run, "--profile", "top", "--output", f"json:{self.output}", env=own)
+        self.assertEqual(result.returncode, 0, result.stderr)
+
     def test_the_record_of_the_last_run(self):
         state = {"XDG_STATE_HOME": str(self.directory / "state")}
         self.assertEqual(self.run_fake(env=state).returncode, 0)

@@ -204,11 +204,16 @@ void requirePhone(const std::filesystem::path& file, const Options& options, con
                                                 "'quazor phone list' shows them");
 }
 
+void addFilesOf(const std::vector<Profile>& profiles, std::vector<std::filesystem::path>& files) {
+  for (const Profile& one : profiles) files.push_back(one.file);
+}
+
 // The selected phone.
 struct ChosenPhone {
   std::string name;  // as records have it
   SeededPhoneMaker make;
   std::vector<SkipRule> absent;
+  std::vector<std::filesystem::path> bases{};  // the files that it is based on
 };
 
 ChosenPhone choosePhone(const Options& options, const Installation& installation) {
@@ -222,18 +227,21 @@ ChosenPhone choosePhone(const Options& options, const Installation& installation
       options.phone.empty() ? installation.defaultScenario() : installation.scenario(options.phone);
   requirePhone(scenario, options, installation);
   const ScenarioSource source = installation.scenarioSource();
-  return {scenario.string(), seededPhonesOfScenario(scenario, options.realTime, source),
-          absentOnScenario(scenario, source)};
+  ScenarioSummary summary = summaryOfScenario(scenario, source);
+  return {scenario.string(), seededPhonesOfScenario(scenario, options.realTime, source), std::move(summary.absent),
+          std::move(summary.bases)};
 }
 
 }  // namespace
 
 ExitCode runCommand(const Options& given, const Installation& installation, Console& console, WatchedSignals* signals) {
-  const Options options = given.onlyFailed ? optionsToRunAgain(given, installation) : given;
+  Options options = given.onlyFailed ? optionsToRunAgain(given, installation) : given;
   if (options.onlyFailed && options.names.empty()) return performNothing(options, installation, console);
   Selection selection = select(options, installation, signals);
   refuseUnusedSkips(options.choice.skips, selection);
   const ChosenPhone phone = choosePhone(options, installation);
+  options.bases = phone.bases;
+  addFilesOf(selection.profiles, options.bases);
   tellLimitsForOtherValues(selection.profiles, selection.diagnostics, console.err);
   std::vector<Job> jobs;
   for (ResolvedDiagnostic& one : selection.diagnostics) {
@@ -269,6 +277,20 @@ ResolvedParameters reboundParameters(const DiagnosticRecord& record, const Resol
     one.source = found->source + ", in the record";
   }
   return parameters;
+}
+
+// The limits of the record. One whose diagnostics were skipped or ended in an error there is not missed in the
+// analysis, as it was not in the run.
+std::vector<UserLimit> limitsToAnalyze(const RecordedRun& run) {
+  std::vector<UserLimit> limits = run.began.limits;
+  for (UserLimit& limit : limits) {
+    if (limit.diagnostic.empty()) continue;
+    const bool isMeant = std::any_of(run.records.begin(), run.records.end(), [&limit](const DiagnosticRecord& one) {
+      return !isOfLimit(one) && appliesTo(limit, one.name);
+    });
+    limit.onlyIfSelected = limit.onlyIfSelected || isMeant;
+  }
+  return limits;
 }
 
 // The diagnostic in which the recorded run stopped before its end, as in RunEnded; nothing if it came to its end. One
@@ -313,6 +335,7 @@ ExitCode analyzeCommand(const Options& given, const Installation& installation, 
   }
   if (options.plugins.empty()) options.plugins = recordedPlugins(run.began.plugins, installation);
   const Selection selection = select(options, installation, signals);
+  addFilesOf(selection.profiles, options.bases);
   std::vector<QZExperimentResult> results(analysable.size());
   std::vector<ResolvedDiagnostic> rebound;
   std::vector<Job> jobs;
@@ -339,7 +362,7 @@ ExitCode analyzeCommand(const Options& given, const Installation& installation, 
   began.tags = run.began.tags;
   for (const auto& [key, value] : options.tags) began.tags.set(key, value);
   began.acceptFlaky = run.began.acceptFlaky;
-  began.limits = limitsOfAnalysis(run.began.limits, selection.limits);
+  began.limits = limitsOfAnalysis(limitsToAnalyze(run), selection.limits);
   const std::optional<std::string> interruption = interruptionIn(run, analysable);
   if (interruption) {
     for (const PlannedDiagnostic& one : missingOf(run.began, run.records)) began.names.push_back(one.name);

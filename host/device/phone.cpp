@@ -118,11 +118,6 @@ PhoneMaker phonesOfBinding(const std::filesystem::path& file) {
       [binding = read(readBindingFile, file, kOfBinding).binding] { return std::make_unique<PhoneOfBinding>(binding); };
 }
 
-std::vector<SkipRule> absentOnScenario(const std::filesystem::path& file, const ScenarioSource& find) {
-  const auto readIt = [&find](const std::filesystem::path& one) { return readScenarioFile(one, find); };
-  return read(readIt, file).absent;
-}
-
 std::vector<SkipRule> absentOnBinding(const std::filesystem::path& file) {
   return read(readBindingFile, file, kOfBinding).absent;
 }
@@ -141,7 +136,8 @@ std::shared_ptr<LogBackend> systemLogOfThisMachine() {
 ScenarioSummary summaryOfScenario(const std::filesystem::path& file, const ScenarioSource& find) {
   const auto readIt = [&find](const std::filesystem::path& one) { return readScenarioFile(one, find); };
   ScenarioFile read = quazor::read(readIt, file);
-  return {read.scenario.title, std::move(read.expected), !read.scenario.faults.empty(), std::move(read.absent)};
+  return {read.scenario.title, std::move(read.expected), !read.scenario.faults.empty(), std::move(read.absent),
+          std::move(read.scenario.bases)};
 }
 
 }  // namespace quazor

@@ -64,8 +64,7 @@ PhoneMaker phonesOfScenario(const std::filesystem::path& file, bool realTime, st
 SeededPhoneMaker seededPhonesOfScenario(const std::filesystem::path& file, bool realTime,
                                         const ScenarioSource& find = nullptr);
 
-// What the phone of a scenario or binding file cannot run. Throws like phonesOfScenario.
-std::vector<SkipRule> absentOnScenario(const std::filesystem::path& file, const ScenarioSource& find = nullptr);
+// What the phone of a binding file cannot run. Throws like phonesOfBinding.
 std::vector<SkipRule> absentOnBinding(const std::filesystem::path& file);
 
 struct ScenarioSummary {
@@ -73,6 +72,7 @@ struct ScenarioSummary {
   std::vector<ExpectedOutcome> expected;
   bool hasFaults = false;
   std::vector<SkipRule> absent{};
+  std::vector<std::filesystem::path> bases{};  // the files that it is based on
 };
 
 // Prefix of a phone's name that selects the machine quazor runs on; the name of the binding file follows.

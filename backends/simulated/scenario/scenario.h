@@ -75,6 +75,7 @@ struct Scenario {
   // The document of the file after its base was merged in. The host reads the key `expect` from it, the expected
   // outcome of runs, which the phone ignores. Null if the scenario is not from a file.
   std::shared_ptr<const JsonDocument> document;
+  std::vector<std::filesystem::path> bases{};  // the files that the scenario is based on, the nearest first
 };
 
 // Finds the scenario of a name, which is not a file's; empty if there is none.

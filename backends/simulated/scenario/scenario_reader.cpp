@@ -28,6 +28,7 @@ class Loader {
       document->setValue(merged(*document, file));
     Scenario scenario = scenarioOf(JsonCursor(*document));
     scenario.document = std::move(document);
+    scenario.bases = bases_;
     return scenario;
   }
 
@@ -43,6 +44,7 @@ class Loader {
     }
     Json patch = document.value();
     patch.erase("base");
+    bases_.push_back(baseFile);
     Json result = loadBase(baseFile, base);
     result.merge_patch(patch);
     return result;
@@ -73,6 +75,7 @@ class Loader {
 
   const ScenarioFinder& find_;
   std::vector<fs::path> open_;
+  std::vector<fs::path> bases_;
 };
 
 }  // namespace
