@@ -61,10 +61,10 @@ def healthy_again(step):
     healthy_run(step, "next", FRONT, 2.015)
 
 
-def as_the_kernel_counts(step, label, cameras, ports=PORTS):
+def as_the_kernel_counts(step, label, cameras, ports=PORTS, seconds=3.015):
     """Checks that the counts of every camera equal the number of buffers dequeued until they were read. `ports` has
     the bus info of each camera."""
-    entry = healthy_run(step, label, cameras, 3.015)
+    entry = healthy_run(step, label, cameras, seconds)
     trace = read_trace(step.text(f"{label}.trace"))
     minors = dict(line.split() for line in step.text(f"{label}.minors").splitlines())
     moment = trace.end_of_silence()

@@ -184,8 +184,27 @@ def usb_unplugged_anytime(step):
 
 
 def usb_60s(step):
-    cameras.healthy_run(step, "front", cameras.FRONT, 60.015)
+    bound = json.loads(step.text("front.json"))["cameras"]
+    ports = {NAMES[port]: camera["node"]["busInfo"] for port, camera in bound.items()}
+    cameras.as_the_kernel_counts(step, "front", cameras.FRONT, ports, seconds=60.015)
     activity(step, "cameras")
+
+
+def usb_sensor_unplugged(step):
+    step.ended_in_error("absent", sensors.NIMBE, 3, "Nimbe device match was ambiguous!")
+    for report, code, message in ((171, 4, "Failed to override power mode to active!"),
+                                  (172, 5, "Failed to set streaming mode to images only!")):
+        below = underlying(step.ended_in_error(f"set_up_{report}", sensors.NIMBE, code, message))
+        # usbhid waits for the answer as long as for that of a sensor that is there.
+        expect_equal(f"the cause ({report})", (below["domain"], below["code"]), (sensors.LINUX, sensors.NO_ANSWER))
+        expect_run_of(step, f"set_up_{report}", ANSWER)
+    for reports in (0, 1, 2, 29):
+        step.ended_in_error(f"after_{reports}", sensors.LINUX, sensors.DEVICE_GONE)
+        device = sensors.device_of(step, f"leaving_{reports}")
+        expect_equal(f"what the device sent ({reports})", (device["sent"], device["removed"]), (reports, True))
+    expect_equal("the frame IDs before the stop", len(sensors.frame_ids(step, "at_stop")), 30)
+    expect_equal("the frame IDs of the next run", len(sensors.frame_ids(step, "next")), 30)
+    expect_equal("ports in use", step.text("ports"), "")
 
 
 def usb_sensor(step):

@@ -23,10 +23,12 @@ class KernelTrace:
     writes: list  # times in seconds
 
     def end_of_silence(self):
-        """The first write after the longest time without one. A program that sleeps while cameras stream writes
-        nothing, and writes again when it has read the results."""
-        between = zip(self.writes, self.writes[1:])
-        return max(between, key=lambda pair: pair[1] - pair[0])[1]
+        """The first write after the last long time without one, which is at least half of the longest. A program that
+        sleeps while cameras stream writes nothing but that it is still running, every half minute, and writes again
+        when it has read the results."""
+        between = list(zip(self.writes, self.writes[1:]))
+        longest = max(later - earlier for earlier, later in between)
+        return [later for earlier, later in between if later - earlier >= longest / 2][-1]
 
     def dequeued_before(self, minor, moment):
         return [buffer for buffer in self.dequeued if buffer.minor == minor and buffer.time < moment]

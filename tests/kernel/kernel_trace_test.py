@@ -30,6 +30,11 @@ class KernelTraceTest(unittest.TestCase):
         self.assertEqual(trace.dequeued_before(7, 9.0), [Dequeued(6.043, 7, 6000000000, 0)])
         self.assertEqual(trace.dequeued_before(4, 10.0), [])
 
+    def test_a_line_while_the_program_waits_does_not_end_the_silence(self):
+        write = "          quazor-81      [000] .....     {}: sys_write(fd: 5, buf: 7ffd5c, count: 1f)\n"
+        trace = read_trace("".join(write.format(moment) for moment in ("6.000000", "36.500000", "66.500000", "66.600000")))
+        self.assertEqual(trace.end_of_silence(), 66.5)
+
     def test_missing_sequence_numbers_are_gaps(self):
         trace = read_trace(TRACE)
         self.assertEqual([gaps_in(trace.dequeued_before(3, moment)) for moment in (6.0, 6.02, 9.0, 10.0)], [0, 0, 0, 2])

@@ -65,6 +65,8 @@ STEPS = [
          boot=3),
     Step("usb_unplugged_anytime", "a USB camera is unplugged at ten moments of a stream", usb.usb_unplugged_anytime,
          boot=3, limit=120, thorough=True),
-    Step("usb_60s", "two USB cameras for 60 s, without loss", usb.usb_60s, boot=3, limit=120, soak=True, thorough=True),
+    Step("usb_60s", "two USB cameras for 60 s, without loss, as the kernel counts them", usb.usb_60s, boot=3, limit=120, soak=True, thorough=True),
     Step("usb_sensor", "a USB sensor; one that stalls, is silent, pauses, is unplugged", usb.usb_sensor, boot=4),
+    Step("usb_sensor_unplugged", "a USB sensor is unplugged before, in and after each stage of a run",
+         usb.usb_sensor_unplugged, boot=4),
 ]

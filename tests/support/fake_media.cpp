@@ -59,12 +59,17 @@ void setFormat(FakeEntity& entity, std::uint32_t pad, PadFormat wanted) {
   if (set.isSource && hasSink(entity)) {
     wanted.code = set.format.code;
     if (!entity.scales) wanted = set.format;
+    if (entity.cropsSources) wanted = {set.format.code, set.crop.width, set.crop.height};
   }
   set.format = wanted;
   if (set.isSource) return;
   set.crop = {0, 0, wanted.width, wanted.height};
   for (FakePad& source : entity.pads) {
     if (!source.isSource) continue;
+    if (entity.cropsSources) {
+      source.format.code = entity.outputCode != 0 ? entity.outputCode : wanted.code;
+      continue;
+    }
     source.format = wanted;
     if (entity.outputCode != 0) source.format.code = entity.outputCode;
   }
@@ -196,11 +201,15 @@ int FakeV4l2Api::subdeviceCall(FakeNode& node, int descriptor, unsigned long req
     case VIDIOC_SUBDEV_S_SELECTION: {
       auto& selection = *static_cast<v4l2_subdev_selection*>(argument);
       FakePad* const pad = padOf(*entity, selection.pad);
-      if (pad == nullptr || pad->isSource || selection.target != V4L2_SEL_TGT_CROP) return EINVAL;
+      if (pad == nullptr || (pad->isSource && !entity->cropsSources) || selection.target != V4L2_SEL_TGT_CROP)
+        return EINVAL;
       if (request == VIDIOC_SUBDEV_S_SELECTION) {
-        const auto inside = [](std::uint32_t wanted, std::uint32_t most) { return std::min(wanted, most); };
+        const FrameArea sinkCrop = entity->pads[0].crop;
+        const std::uint32_t width = pad->isSource ? sinkCrop.width : pad->format.width;
+        const std::uint32_t height = pad->isSource ? sinkCrop.height : pad->format.height;
         pad->crop = {static_cast<std::uint32_t>(selection.r.left), static_cast<std::uint32_t>(selection.r.top),
-                     inside(selection.r.width, pad->format.width), inside(selection.r.height, pad->format.height)};
+                     std::min(selection.r.width, width), std::min(selection.r.height, height)};
+        if (pad->isSource) pad->format = {pad->format.code, pad->crop.width, pad->crop.height};
         node.history.emplace_back("crop");
       }
       selection.r = {static_cast<std::int32_t>(pad->crop.left), static_cast<std::int32_t>(pad->crop.top),

@@ -31,6 +31,7 @@ struct FakeEntity {
   std::uint32_t outputCode = 0;  // of its source pads; 0: that of its sink pad
   bool scales = false;           // its source pads may have another size than its sink pad
   bool hasIntervals = false;     // its pads have intervals
+  bool cropsSources = false;     // its source pads can be cropped, too, and have the size of their crop
 };
 
 // Entities by their place in the list.

@@ -68,12 +68,15 @@ std::string Subdevice::callText(std::string_view call, std::uint32_t pad) const 
 
 bool Subdevice::apply(const PadBinding& wanted, const std::string& purpose, DiagnosticErrorPtr* error) {
   const std::uint32_t pad = wanted.pad.pad;
-  if (std::ranges::find(entity_.pads, pad, &MediaPad::index) == entity_.pads.end()) {
+  const auto found = std::ranges::find(entity_.pads, pad, &MediaPad::index);
+  if (found == entity_.pads.end()) {
     return refuseLinux(error, LinuxErrorCode::kNotSupported, "%@: the entity \"%@\" has no pad %@; it has %@ pads.",
                        purpose, entity_.name, pad, entity_.pads.size());
   }
-  return (!wanted.format || setFormat(pad, *wanted.format, purpose, error)) &&
-         (!wanted.crop || setCrop(pad, *wanted.crop, purpose, error)) &&
+  const auto format = [&] { return !wanted.format || setFormat(pad, *wanted.format, purpose, error); };
+  const auto crop = [&] { return !wanted.crop || setCrop(pad, *wanted.crop, purpose, error); };
+  // A sink is cropped to a part of its format; what a source sends has the size of its crop.
+  return (found->isSource ? crop() && format() : format() && crop()) &&
          (!wanted.interval || setInterval(pad, *wanted.interval, purpose, error));
 }
 
