@@ -8,6 +8,8 @@
 
 #include <algorithm>
 #include <cmath>
+#include <cstdint>
+#include <cstdlib>
 #include <map>
 #include <optional>
 #include <string_view>
@@ -27,9 +29,10 @@ constexpr int kStageRow = 1;
 constexpr int kLogRow = 2;
 constexpr int kFirstStreamRow = 3;
 
-std::string quoted(const std::string& text) {
-  return Json(text).dump(-1, ' ', false, nlohmann::detail::error_handler_t::replace);
-}
+// U+FFFD replaces invalid UTF-8.
+std::string textOf(const Json& json) { return json.dump(-1, ' ', false, nlohmann::detail::error_handler_t::replace); }
+
+std::string quoted(const std::string& text) { return textOf(Json(text)); }
 
 // Microseconds, the unit of the format, without loss: a double has not enough digits for long runs.
 std::string microseconds(nanoseconds time) {
@@ -37,6 +40,22 @@ std::string microseconds(nanoseconds time) {
   const std::string digits = std::to_string(1000 + std::abs(count % 1000)).substr(1);
   return (count < 0 && count > -1000 ? "-" : "") + std::to_string(count / 1000) + "." + digits;
 }
+
+// The diagnostic that is running; its times are those of the time line.
+struct Running {
+  int process = 0;
+  DiagnosticStarted began;
+  nanoseconds begin{};
+  nanoseconds zero{};    // of the phone's clock
+  nanoseconds cursor{};  // the end of the last stage
+  nanoseconds latest{};
+  std::optional<StageStarted> stage;
+  std::map<Stage, nanoseconds> ends;
+  std::optional<Failed> failure;
+  std::optional<Skip> skip;
+  std::map<std::string, int> streams;
+  std::map<std::string, std::uint64_t> steps;
+};
 
 // Thread: one at a time.
 class TimelineWriter {
@@ -52,31 +71,15 @@ class TimelineWriter {
     if (!run_) return "{\"traceEvents\":[]}\n";
     addRow(0, kWholeRow, "run");
     addProcess(0, "quazor");
-    addDuration({0, kWholeRow}, nanoseconds(0), end_, "run", runJson(*run_).dump());
-    return "{\"displayTimeUnit\":\"ms\",\"otherData\":" + runJson(*run_).dump() + ",\"traceEvents\":[\n" + text_ +
-           "\n]}\n";
+    const std::string run = textOf(runJson(*run_));
+    addDuration({0, kWholeRow}, nanoseconds(0), end_, "run", run);
+    return "{\"displayTimeUnit\":\"ms\",\"otherData\":" + run + ",\"traceEvents\":[\n" + text_ + "\n]}\n";
   }
 
  private:
   struct Row {
     int process;
     int row;
-  };
-
-  // The diagnostic that is running; its times are those of the time line.
-  struct Running {
-    int process = 0;
-    DiagnosticStarted began;
-    nanoseconds begin{};
-    nanoseconds zero{};    // of the phone's clock
-    nanoseconds cursor{};  // the end of the last stage
-    nanoseconds latest{};
-    std::optional<StageStarted> stage;
-    std::map<Stage, nanoseconds> ends;
-    std::optional<Failed> failure;
-    std::optional<Skip> skip;
-    std::map<std::string, int> streams;
-    std::map<std::string, std::uint64_t> steps;
   };
 
   void take(const RunStarted& run) { run_ = run; }
@@ -123,7 +126,7 @@ class TimelineWriter {
     for (const auto& [name, measurement] : added.measurements) {
       const Row row{diagnostic_->process, kWholeRow};
       const Json arguments = {{measurement.unit().symbol(), numberJson(measurement.value())}};
-      const std::string text = arguments.dump(-1, ' ', false, nlohmann::detail::error_handler_t::replace);
+      const std::string text = textOf(arguments);
       // What is no number is no point of a counter's curve.
       if (std::isfinite(measurement.value())) {
         addAt("C", row, diagnostic_->cursor, name, text);
@@ -217,10 +220,6 @@ class TimelineWriter {
     addDuration({running.process, kWholeRow}, running.begin, running.latest, running.began.name, textOf(arguments));
     end_ = running.latest;
     diagnostic_.reset();
-  }
-
-  static std::string textOf(const Json& json) {
-    return json.dump(-1, ' ', false, nlohmann::detail::error_handler_t::replace);
   }
 
   void addProcess(int process, const std::string& name) {
