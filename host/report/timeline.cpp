@@ -67,13 +67,13 @@ class TimelineWriter {
   }
 
   std::string finish() {
-    if (diagnostic_) endDiagnostic(std::nullopt);
     if (!run_) return "{\"traceEvents\":[]}\n";
+    if (diagnostic_) endDiagnostic(std::nullopt);
     addRow(0, kWholeRow, "run");
     addProcess(0, "quazor");
-    const std::string run = textOf(runJson(*run_));
-    addDuration({0, kWholeRow}, nanoseconds(0), end_, "run", run);
-    return "{\"displayTimeUnit\":\"ms\",\"otherData\":" + run + ",\"traceEvents\":[\n" + text_ + "\n]}\n";
+    addDuration({0, kWholeRow}, nanoseconds(0), end_, "run", textOf(runJson(*run_)));
+    text_ += "\n]}\n";
+    return std::move(text_);
   }
 
  private:
@@ -82,14 +82,18 @@ class TimelineWriter {
     int row;
   };
 
-  void take(const RunStarted& run) { run_ = run; }
+  void take(const RunStarted& run) {
+    run_ = run;
+    text_ = "{\"displayTimeUnit\":\"ms\",\"otherData\":" + textOf(runJson(run)) + ",\"traceEvents\":[";
+  }
 
   void take(const DiagnosticStarted& began) {
+    if (!run_) return;
     if (diagnostic_) endDiagnostic(std::nullopt);
     Running& running = diagnostic_.emplace();
     running.process = ++processes_;
     running.began = began;
-    running.begin = std::max(run_ ? nanoseconds(began.date - run_->date) : nanoseconds(0), end_);
+    running.begin = std::max(nanoseconds(began.date - run_->date), end_);
     running.zero = running.cursor = running.latest = running.begin;
     DiagnosticRecord named;
     named.trial = {began.attempt, 0, began.repetition, 0};
@@ -151,9 +155,9 @@ class TimelineWriter {
       step = traced.step;
     }
     for (const TracedFrame& frame : traced.frames) {
-      std::string arguments = "{\"captured\":" + microseconds(diagnostic_->zero + nanoseconds(frame.captured));
+      std::string arguments = "{\"latency\":" + microseconds(nanoseconds(frame.delivered - frame.captured));
       if (frame.returned) {
-        arguments += ",\"returned\":" + microseconds(diagnostic_->zero + nanoseconds(*frame.returned));
+        arguments += ",\"held\":" + microseconds(nanoseconds(*frame.returned - frame.delivered));
       }
       addInstant(row, seen(nanoseconds(frame.delivered)), "frame " + std::to_string(frame.number), arguments + "}");
     }
@@ -254,7 +258,7 @@ class TimelineWriter {
   }
 
   void addEvent(const char* kind, Row row, const std::string& content) {
-    text_ += text_.empty() ? "" : ",\n";
+    text_ += text_.ends_with('[') ? "\n" : ",\n";
     text_ += "{\"ph\":\"" + std::string(kind) + "\",\"pid\":" + std::to_string(row.process) +
              ",\"tid\":" + std::to_string(row.row) + content + "}";
     if (text_.size() > most_) {
