@@ -138,8 +138,8 @@ class V4l2Device final {
   std::vector<UndescribedControl> undescribed_;
 };
 
-// The text of a fixed-size kernel field. Its last character is the null, even if a driver forgets it: a binding has room
-// for no more.
+// The text of a fixed-size kernel field. Its last character is the null, even if a driver forgets it: a binding has
+// room for no more.
 template <class Character, std::size_t kSize>
 std::string fixedText(const Character (&field)[kSize]) {
   const auto* const text = reinterpret_cast<const char*>(field);
