@@ -22,22 +22,22 @@ struct Example {
 
 constexpr Example kExamples[] = {
     {"quazor list", "list the installed diagnostics and experiments"},
-    {"quazor run --all --except 'Tessel*'", "run every diagnostic except these"},
     {"quazor describe 'CameraSync*'", "what these diagnostics do, and their parameters"},
     {"quazor run --all", "run every diagnostic on the healthy simulated phone"},
-    {"quazor run CameraSyncDiagnostic.Back --set duration=10"},
-    {"quazor run --all --phone my_phone.json --format json --output report.json"},
+    {"quazor run --all --except 'Tessel*'", "run every diagnostic except these"},
+    {"quazor run CameraSyncDiagnostic.Back --set duration=10", "run one, with a parameter that 'describe' shows"},
+    {"quazor run --all --phone my_phone.json --format json --output report.json", "on a simulated phone of your own"},
     {"quazor phone list 'camera_sync/*'", "the simulated phones of that name"},
     {"quazor phone probe", "find this machine's devices and print a starter binding"},
     {"quazor run --all --phone linux:board.json", "run on this machine's own cameras, sensors and counters"},
     {"quazor run --all --limit '*.Total >= 90'", "also judge by a limit of your own"},
-    {"quazor run --all --profile strict", "also judge by limits for totals and offsets in 3 s"},
-    {"quazor run --all --record records/ --tag serial=C02X --output junit:report.xml"},
+    {"quazor run --all --profile strict", "also judge each camera by its frames and its start"},
+    {"quazor run --all --record records/ --tag serial=C02X --output junit:report.xml", "for a CI server"},
     {"quazor run --all --repeat 100", "run everything 100 times and show what varied"},
     {"quazor run --only failed", "rerun the diagnostics that did not pass last time"},
     {"quazor experiment CameraSyncExperiment.Back", "measure without judging"},
     {"quazor verify run.jsonl", "check that the recorded verdicts follow from the data"},
-    {"quazor analyze run.jsonl --set analysis.frameCount=60"},
+    {"quazor analyze run.jsonl --set analysis.frameCount=60", "judge the recorded measurements again"},
     {"quazor diff before.jsonl after.jsonl", "show what differs between two records"},
     {"quazor report run.jsonl --format trace --output run.trace.json", "a time line for a viewer of traces"},
     {"quazor explain QZCapturePlugInErrorDomain:206", "what an error means, and what to do next"},
@@ -115,7 +115,9 @@ std::string helpFooter() {
     if (one.code < 2 || one.commands == "analyze describe") continue;  // told with run
     add(one.code, one.code == 3 ? "verify, analyze: a record is incomplete, because its run did not end" : one.meaning);
   }
-  return footerOf(examples, codes);
+  return "Without --phone, the phone is a simulated, healthy one.\n"
+         "The manual page is quazor(1); share/doc/quazor/index.md in the installation lists the documents.\n\n" +
+         footerOf(examples, codes);
 }
 
 std::string helpFooter(std::string_view command) {

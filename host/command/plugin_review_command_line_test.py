@@ -33,6 +33,14 @@ class ReviewCase(CommandLineTest):
         self.assertEqual(result.returncode, 66 if counts["problem"] else 0)
         return findings
 
+    shipped_reviews = {}
+
+    def review_of_shipped(self, name):
+        """One review for all tests of a shipped plug-in: it runs every diagnostic on a phone."""
+        if name not in self.shipped_reviews:
+            self.shipped_reviews[name] = self.review(SHIPPED / name)
+        return self.shipped_reviews[name]
+
     def texts(self, rating, findings):
         return [text for one, text in findings if one == rating]
 
@@ -47,14 +55,14 @@ class ShippedTest(ReviewCase):
         self.assertGreaterEqual(len(plugins), 3)
         for plugin in plugins:
             with self.subTest(plugin.name):
-                findings = self.review(plugin)
+                findings = self.review_of_shipped(plugin.name)
                 self.assertEqual(self.texts("problem", findings), [])
                 self.assert_said("ok", r"^contract: built for version \d+", findings)
                 self.assert_said("ok", r"^hardening: functions are bound at the start", findings)
                 self.assert_said("ok", r"^name: \d+ names?, of the usual form", findings)
 
     def test_every_diagnostic_was_run_and_is_explained(self):
-        findings = self.review(SHIPPED / "camera_sensor_diagnostics.so")
+        findings = self.review_of_shipped("camera_sensor_diagnostics.so")
         for name, results in (("CameraSyncDiagnostic.Back", "9 results, 2 with limits"),
                               ("CameraSyncDiagnostic.Front", "6 results, 1 with a limit"),
                               ("TesselFaultDiagnostic", "64 results, 64 with limits"),
@@ -70,7 +78,7 @@ class ShippedTest(ReviewCase):
         self.assert_said("ok", "^NimbeImageExperiment: returns a result on the healthy phone", findings)
 
     def test_what_loading_and_describing_took(self):
-        findings = self.review(SHIPPED / "camera_sensor_diagnostics.so")
+        findings = self.review_of_shipped("camera_sensor_diagnostics.so")
         for what in ("loading", "describing"):
             cost = [text for _, text in findings if text.startswith(f"{what}: ")]
             self.assertRegex(cost[0], r"^\w+: \d+\.\d ms, \d+\.\d MiB")

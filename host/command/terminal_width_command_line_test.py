@@ -19,6 +19,11 @@ def squeezed(text):
     return re.sub(r"\s", "", CSI.sub("", text))
 
 
+def without_identity(text):
+    """What two runs of the same diagnostics have in common."""
+    return re.sub(r"\b[0-9a-f]{32}\b", "ID", re.sub(r"\d{4}-\d\d-\d\dT[\d:.]+Z", "DATE", text))
+
+
 class TerminalWidthTest(RecordTest):
     def commands(self):
         record = self.recorded()
@@ -48,23 +53,24 @@ class TerminalWidthTest(RecordTest):
         ]
 
     def test_no_line_is_wider_than_the_terminal(self):
-        for arguments in self.commands():
-            for columns in WIDTHS:
-                for env in (UTF8, PLAIN):
-                    with self.subTest(arguments=arguments, columns=columns, env=env):
-                        code, output = on_terminal(columns, *arguments, env=env)
-                        self.assertLess(code, 70, output)
-                        self.assertGreaterEqual(code, 0, output)
-                        self.assertTrue(output)
-                        for line in lines_on_screen(output):
-                            self.assertLessEqual(width_of(line), columns, line)
-                        if env is PLAIN:
-                            self.assertTrue(output.isascii(), output)
+        commands = self.commands()
+        # What stands for characters of UTF-8 is wider, which matters where there is the least room.
+        for columns, env in (*((columns, UTF8) for columns in WIDTHS), (min(WIDTHS), PLAIN)):
+            for arguments in commands:
+                with self.subTest(arguments=arguments, columns=columns, env=env):
+                    code, output = on_terminal(columns, *arguments, env=env)
+                    self.assertLess(code, 70, output)
+                    self.assertGreaterEqual(code, 0, output)
+                    self.assertTrue(output)
+                    for line in lines_on_screen(output):
+                        self.assertLessEqual(width_of(line), columns, line)
+                    if env is PLAIN:
+                        self.assertTrue(output.isascii(), output)
 
     def test_nothing_is_lost_on_a_narrow_terminal(self):
-        # Names, numbers and limits are there, whatever the layout. A block needs neither a heading for its first line
-        # nor cells without a value.
-        left_out = {"-", "Parameter", "Result", "Phone", "Run"}
+        # Names, numbers and limits are there as often as in a pipe, whatever the layout. A block needs neither a heading
+        # for its first line nor cells without a value.
+        left_out = {"-", "Parameter", "Value", "Result", "Phone", "Run"}
         for arguments in (["list"], ["describe", "*"], ["run", "--all", "--verbose"],
                           ["run", "--all", "--phone", DROPPED, "--profile", "strict", "--verbose"],
                           ["explain"], ["explain", "BackTele.Total"], ["selftest", DROPPED, "healthy"], ["doctor"],
@@ -72,9 +78,11 @@ class TerminalWidthTest(RecordTest):
             with self.subTest(arguments):
                 wide = re.sub(r"\ARun .*\n", "", quazor(*arguments).stdout)  # another run
                 narrow = squeezed(on_terminal(40, *arguments)[1].decode())
-                for word in wide.split():
-                    if word not in left_out:
-                        self.assertIn(word, narrow)
+                words = [word for word in wide.split() if word not in left_out]
+                self.assertGreater(len(words), 10)
+                for word in set(words):
+                    # A word may also be a part of others.
+                    self.assertGreaterEqual(narrow.count(word), sum(one.count(word) for one in words), word)
 
     def test_a_pipe_has_no_width(self):
         for columns in ("40", "200"):
@@ -92,9 +100,7 @@ class TerminalWidthTest(RecordTest):
                 self.assertEqual(code, 0)
                 text = "".join(line + "\n" for line in output.decode().replace("\r\n", "\n").split("\n")[:-1])
                 text = re.sub(r"Running [^\r]*|\r\x1b\[K", "", text)
-                piped = quazor(*arguments).stdout
-                # Identities and times differ between two runs, but not the number of lines.
-                self.assertEqual(text.count("\n"), piped.count("\n"))
+                self.assertEqual(without_identity(text), without_identity(quazor(*arguments).stdout))
 
     def test_wide_characters_count_twice(self):
         scenario = self.phone.read_text().replace("One camera", "\u76f8\u673a\u6d4b\u8bd5" * 12 + " e\u0301" * 30)
