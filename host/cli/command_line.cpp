@@ -269,10 +269,9 @@ std::vector<std::string> namesOfPhoneCommand(const CLI::App& command, const RawO
 }
 
 Options optionsOf(const CLI::App& command, const RawOptions& raw) {
-  for (const char* option :
-       {"--plugin", "--output", "--profile",   "--parameters", "--phone", "--record",    "--of",
-        "RECORD",   "--memory", "--log-limit", "--trace",      "--grace", "--heartbeat", "--settle",
-        "--except", "--skip",   "--attempts",  "--repeat",     "--from",  "--to"}) {
+  for (const char* option : {"--plugin", "--output", "--profile", "--parameters", "--phone",  "--record", "--of",
+                             "RECORD",   "FOLDER",   "--memory",  "--log-limit",  "--trace",  "--grace",  "--heartbeat",
+                             "--settle", "--except", "--skip",    "--attempts",   "--repeat", "--from",   "--to"}) {
     refuseEmpty(command, option);
   }
   Options options;

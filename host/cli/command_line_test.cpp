@@ -308,6 +308,7 @@ TEST(ParseCommandLine, RefusesWrongUsage) {
       {{"verify"}, "RECORD"},
       {{"diff", "a", "b", "c"}, "c"},
       {{"diff", "a"}, "RECORD"},
+      {{"new", ""}, "FOLDER"},
       {{"analyze"}, "RECORD"},
       {{"selftest", "--seeds", "0"}, "--seeds '0': expected an integer from 1 to 1000000"},
       {{"completion", "fish"}, "fish"},

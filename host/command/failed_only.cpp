@@ -5,6 +5,7 @@
 #include "host/model/limit_check.h"
 #include "host/record/previous_run.h"
 #include "host/record/record_file.h"
+#include "host/text/table.h"
 
 #include <sys/stat.h>
 #include <unistd.h>
@@ -134,6 +135,18 @@ Options optionsToRunAgain(Options options, const Installation& installation) {
   const bool allRecorded = options.recorded->entries.size() == options.names.size();
   if (options.profile.empty() && allRecorded) options.withoutProfile = true;
   return options;
+}
+
+void tellUnrecorded(const Options& options, std::ostream& err) {
+  const std::vector<ProfileEntry>& recorded = options.recorded->entries;
+  for (const std::string& name : options.names) {
+    const bool isRecorded =
+        std::any_of(recorded.begin(), recorded.end(), [&name](const ProfileEntry& one) { return one.name == name; });
+    if (isRecorded) continue;
+    err << "quazor: " << printable(name)
+        << ": that run ended before this diagnostic began, so the record has no parameters of it; it gets those of the "
+           "profile, unless --set or --parameters gives others\n";
+  }
 }
 
 }  // namespace quazor

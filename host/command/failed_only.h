@@ -4,6 +4,8 @@
 #include "host/cli/command_line.h"
 #include "host/cli/installation.h"
 
+#include <ostream>
+
 namespace quazor {
 
 // Completes the options of `run --only failed` from the record given by --of, or from that of the previous run: the
@@ -13,5 +15,9 @@ namespace quazor {
 // could not be loaded in that run, or if the record is not the user's own of the previous run and names a plug-in that
 // is not installed; kUsage for a seed or real time if that run's phone was not simulated.
 Options optionsToRunAgain(Options options, const Installation& installation);
+
+// Names on `err` the diagnostics whose parameters the record lacks, because that run ended before they began. They may
+// pass with others.
+void tellUnrecorded(const Options& options, std::ostream& err);
 
 }  // namespace quazor

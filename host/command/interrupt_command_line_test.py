@@ -160,6 +160,11 @@ class InterruptTest(CommandLineTest):
     def test_what_was_interrupted_can_be_run_then(self):
         self.interrupted()
         result = self.run_fake("--only", "failed", "--of", self.record, "--format", "json", names=[])
+        began = [event["name"] for event in events_in(self.record) if event["event"] == "diagnosticBegan"]
+        for name in self.NAMES:
+            self.assertEqual(f"quazor: {name}: that run ended before this diagnostic began" in result.stderr,
+                             name not in began, result.stderr)
+        self.assertLess(len(began), len(self.NAMES))
         self.assertEqual([record["name"] for record in json.loads(result.stdout)["diagnostics"]], list(self.NAMES))
 
     def test_an_interrupt_while_plugins_are_loaded(self):

@@ -173,6 +173,24 @@ class LimitsTest(CommandLineTest):
         self.assertIn("the limit 'Nowhere > 0' fits no result", done.stderr)
 
 
+    def test_limits_of_the_default_profile_of_today_are_not_those_of_the_run_before(self):
+        names = ["CameraSyncDiagnostic.Back", "CameraSyncDiagnostic.Front"]
+        record = self.directory / "run.jsonl"
+        self.assertEqual(quazor("run", *names, "--record", record).returncode, 0)
+        lines = record.read_text().splitlines(keepends=True)
+        second = [i for i, line in enumerate(lines) if '"event":"diagnosticBegan"' in line][1]
+        record.write_text("".join(lines[:second]))
+        profiles = self.directory / "quazor/profiles"
+        profiles.mkdir(parents=True)
+        (profiles / "default.json").write_text(json.dumps({"schema": 1, "base": "default", "diagnostics": {
+            "CameraSyncDiagnostic.*": {"limits": [{"limit": "*.Total >= 1000"}]}}}))
+        home = {"XDG_DATA_HOME": str(self.directory)}
+        self.assertEqual(quazor("run", names[1], env=home).returncode, 1)
+        done = quazor("run", "--only", "failed", "--of", record, env=home)
+        self.assertEqual(done.returncode, 0, done.stdout)
+        self.assertIn(f"{names[1]}: that run ended before this diagnostic began", done.stderr)
+
+
 class StrictProfileTest(CommandLineTest):
     def test_finds_what_measured_results_can_show(self):
         for phone, code in (("healthy", 0), ("camera_sync/frames_dropped", 1), ("camera_sync/frame_rate_drift", 1),

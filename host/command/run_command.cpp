@@ -237,6 +237,7 @@ ChosenPhone choosePhone(const Options& options, const Installation& installation
 ExitCode runCommand(const Options& given, const Installation& installation, Console& console, WatchedSignals* signals) {
   Options options = given.onlyFailed ? optionsToRunAgain(given, installation) : given;
   if (options.onlyFailed && options.names.empty()) return performNothing(options, installation, console);
+  if (options.onlyFailed) tellUnrecorded(options, console.err);
   Selection selection = select(options, installation, signals);
   refuseUnusedSkips(options.choice.skips, selection);
   const ChosenPhone phone = choosePhone(options, installation);

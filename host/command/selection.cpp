@@ -74,6 +74,8 @@ std::vector<Profile> profilesOf(const Options& options, const Installation& inst
   std::vector<Profile> profiles;
   if (!options.withoutProfile && options.profile.empty()) {
     addProfile(installation.defaultProfile(), false, installation, profiles);
+    // The record has all limits of its run, those of that run's default profile, too.
+    if (options.recorded) std::for_each(profiles.begin(), profiles.end(), [](Profile& one) { one.limits.clear(); });
   }
   if (options.recorded) profiles.push_back(*options.recorded);
   if (!options.withoutProfile && !options.profile.empty()) {
