@@ -153,17 +153,19 @@ void addHeartbeat(CLI::App& command, RawOptions& raw) {
 }
 
 void addParameterOptions(CLI::App& command, RawOptions& raw) {
+  // A record has the values of the default profile of its run.
+  const bool isAnalysis = command.get_name() == "analyze";
   command
       .add_option(
           "--profile", raw.profile,
-          "Read parameter values and limits from this file or installed profile, for example strict (for 3 s), instead "
-          "of the default profile; 'none' skips it")
+          "Read parameter values and limits from this file or installed profile, for example strict (for 3 s)" +
+              std::string(isAnalysis ? ". They count more than those of the record; without it, no profile is read"
+                                     : ", instead of the default profile; 'none' skips it"))
       ->type_name("FILE|NAME");
-  addRepeatable(
-      command, "--parameters", raw.parameterFiles,
-      "Read more parameter values and limits from this file or installed profile, in addition to --profile or "
-      "the default profile; repeatable",
-      "FILE|NAME");
+  addRepeatable(command, "--parameters", raw.parameterFiles,
+                "Read more parameter values and limits from this file or installed profile, in addition to --profile" +
+                    std::string(isAnalysis ? "" : " or the default profile") + "; repeatable",
+                "FILE|NAME");
   addRepeatable(command, "--set", raw.settings,
                 "Set a parameter of every selected diagnostic that declares it; repeatable. The environment variable "
                 "QUAZOR_SET holds settings in the same form, separated by spaces. Precedence, highest first: --set, "
