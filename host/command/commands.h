@@ -35,6 +35,9 @@ ExitCode verifyCommand(const Options& options, Console& console, WatchedSignals*
 // parameters, errors, results, limits and measurements; dates, durations and log lines are not compared. Throws a
 // CommandError (kCannotRead).
 ExitCode diffCommand(const Options& options, Console& console);
+
+// report: writes the time line of a record, also of one whose run did not end, which it says. Throws a CommandError:
+// kCannotRead for a record that cannot be read, kUsage if the time line would be too large.
 ExitCode reportCommand(const Options& options, Console& console);
 
 // doctor: prints one line per plug-in, backend and file that quazor would use: accepted, or refused with the reason.

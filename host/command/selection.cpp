@@ -75,7 +75,9 @@ std::vector<Profile> profilesOf(const Options& options, const Installation& inst
   if (!options.withoutProfile && options.profile.empty()) {
     addProfile(installation.defaultProfile(), false, installation, profiles);
     // The record has all limits of its run, those of that run's default profile, too.
-    if (options.recorded) std::for_each(profiles.begin(), profiles.end(), [](Profile& one) { one.limits.clear(); });
+    if (options.recorded) {
+      for (Profile& one : profiles) one.limits.clear();
+    }
   }
   if (options.recorded) profiles.push_back(*options.recorded);
   if (!options.withoutProfile && !options.profile.empty()) {

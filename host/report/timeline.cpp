@@ -41,6 +41,16 @@ std::string microseconds(nanoseconds time) {
   return (count < 0 && count > -1000 ? "-" : "") + std::to_string(count / 1000) + "." + digits;
 }
 
+// The sum, or the latest or earliest time that there is: a record may hold any times.
+nanoseconds sumOf(nanoseconds one, nanoseconds other) {
+  nanoseconds::rep sum = 0;
+  const bool isTooLarge = __builtin_add_overflow(one.count(), other.count(), &sum);
+  if (isTooLarge) return other.count() < 0 ? nanoseconds::min() : nanoseconds::max();
+  return nanoseconds(sum);
+}
+
+nanoseconds between(Date begin, Date end) { return sumOf(end.time_since_epoch(), -begin.time_since_epoch()); }
+
 // The diagnostic that is running; its times are those of the time line.
 struct Running {
   int process = 0;
@@ -93,7 +103,7 @@ class TimelineWriter {
     Running& running = diagnostic_.emplace();
     running.process = ++processes_;
     running.began = began;
-    running.begin = std::max(nanoseconds(began.date - run_->date), end_);
+    running.begin = std::max(between(run_->date, began.date), end_);
     running.zero = running.cursor = running.latest = running.begin;
     DiagnosticRecord named;
     named.trial = {began.attempt, 0, began.repetition, 0};
@@ -109,7 +119,7 @@ class TimelineWriter {
 
   void take(const StageEnded& stage) {
     if (!diagnostic_ || !diagnostic_->stage) return;
-    const nanoseconds byWall = stage.date - diagnostic_->stage->date;
+    const nanoseconds byWall = between(diagnostic_->stage->date, stage.date);
     endStage(stage.duration.value_or(byWall), "{}");
     // The phone's clock is that of the experiment, which the plug-in makes once it is loaded.
     if (stage.stage == Stage::kLoad) diagnostic_->zero = diagnostic_->cursor;
@@ -176,13 +186,13 @@ class TimelineWriter {
 
   void take(const DiagnosticEnded& ended) {
     if (!diagnostic_) return;
-    const nanoseconds byWall = ended.date - diagnostic_->began.date;
-    diagnostic_->latest = std::max(diagnostic_->latest, diagnostic_->begin + byWall);
+    const nanoseconds byWall = between(diagnostic_->began.date, ended.date);
+    diagnostic_->latest = std::max(diagnostic_->latest, sumOf(diagnostic_->begin, byWall));
     endDiagnostic(ended.verdict);
   }
 
   void take(const RunEnded& ended) {
-    if (run_) end_ = std::max(end_, nanoseconds(ended.date - run_->date));
+    if (run_) end_ = std::max(end_, between(run_->date, ended.date));
   }
 
   void take(const AuxiliaryDataAdded& /*added*/) {}
@@ -193,7 +203,7 @@ class TimelineWriter {
 
   // A moment by the phone's clock.
   nanoseconds seen(nanoseconds byPhone) {
-    const nanoseconds at = diagnostic_->zero + byPhone;
+    const nanoseconds at = sumOf(diagnostic_->zero, byPhone);
     diagnostic_->latest = std::max(diagnostic_->latest, at);
     return at;
   }
@@ -201,7 +211,7 @@ class TimelineWriter {
   void endStage(nanoseconds length, const char* arguments) {
     Running& running = *diagnostic_;
     const nanoseconds begin = running.cursor;
-    running.cursor += std::max(length, nanoseconds(0));
+    running.cursor = sumOf(begin, std::max(length, nanoseconds(0)));
     running.latest = std::max(running.latest, running.cursor);
     running.ends[running.stage->stage] = running.cursor;
     addDuration({running.process, kStageRow}, begin, running.cursor, std::string(nameOf(running.stage->stage)),

@@ -166,6 +166,23 @@ TEST(Timeline, LeavesOutWhatIsOutsideAPart) {
   EXPECT_EQ(eventsIn(line, "i", "frame 8").size(), 1U);
 }
 
+TEST(Timeline, HasAnEndHoweverLongARecordSaysThatItTook) {
+  std::vector<RunEvent> events = tracedRun();
+  std::get<StageEnded>(events[5]).duration = std::chrono::nanoseconds::max();
+  std::get<StageEnded>(events[9]).duration = std::chrono::nanoseconds::max();
+  std::get<DiagnosticStarted>(events[1]).date = Date::max();
+  std::get<RunStarted>(events[0]).date = Date::min() + 24h;
+  constexpr std::int64_t kLatest = std::chrono::nanoseconds::max().count() / 1000;
+  const Json line = lineOf(events);
+  for (const Json& event : line["traceEvents"]) {
+    if (event["ph"] == "M") continue;
+    EXPECT_GE(event["ts"], 0) << event;
+    if (event["ph"] != "X") continue;
+    EXPECT_GE(event["dur"], 0) << event;
+    EXPECT_LE(event["ts"].get<std::int64_t>(), kLatest - event["dur"].get<std::int64_t>());
+  }
+}
+
 TEST(Timeline, IsRefusedIfItIsTooLarge) {
   const std::size_t size = timelineText(tracedRun()).size();
   EXPECT_NO_THROW(timelineText(tracedRun(), {}, size));

@@ -14,7 +14,7 @@ constexpr bool kHasSanitizer = true;
 constexpr bool kHasSanitizer = false;
 #endif
 
-// Whether to try each of very many equal cases. A sanitizer multiplies their time; it sees what it can see in fewer,
+// Whether to try each of very many similar cases. A sanitizer multiplies their time; it sees what it can see in fewer,
 // and the build without one tries them all.
 inline bool triesAll() { return !kHasSanitizer || isThorough(); }
 
