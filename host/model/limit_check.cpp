@@ -260,7 +260,7 @@ DiagnosticErrorPtr errorOfLimitWithoutResult(const UserLimit& limit, const std::
   const bool isMeant = std::any_of(diagnostics.begin(), diagnostics.end(),
                                    [&limit](const std::string& name) { return appliesTo(limit, name); });
   std::string why = isMeant ? "no result has the name '" + limit.result + "'" + didYouMeanResult(limit.result, names)
-                            : "no diagnostic of this run has the name '" + limit.diagnostic + "'" +
+                            : "no diagnostic was selected that has the name '" + limit.diagnostic + "'" +
                                   didYouMean(limit.diagnostic, diagnostics);
   return hostError(
       HostErrorCode::kLimitWithoutResult,
