@@ -40,7 +40,7 @@ KINDS = {"a diagnostic: pass", "a diagnostic: fail", "a diagnostic: error", "a d
          "no results", "many results", "a deep error", "a value that is not finite", "a limit without bounds",
          "a result: pass", "a result: fail", "a result: error", "a result: none",
          *(f"a {kind}, {severity}: {verdict}" for kind in ("number", "interval", "relation")
-           for severity, verdicts in (("fail", ("pass", "fail", "error")), ("warn", ("pass", "warn")))
+           for severity, verdicts in (("fail", ("pass", "fail", "error", "skip")), ("warn", ("pass", "warn", "skip")))
            for verdict in verdicts),
          "a record with bytes that are no text", "a tolerance", "a tolerance without a bound", "a unit",
          "a limit on a value that is not finite", *(f"a text with {sign!r}" for sign in SIGNS)}

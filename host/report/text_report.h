@@ -41,7 +41,7 @@ void printRecord(std::ostream& out, const DiagnosticRecord& record, bool colour)
 
 // The rows of a table of results.
 enum class ResultRows {
-  kAll,
+  kAll,         // with the severity of the user's limits
   kNoteworthy,  // a result that failed or cannot be judged, and every limit of the user
 };
 
