@@ -98,16 +98,23 @@ function(quazor_library name)
   target_include_directories(quazor_${name} PUBLIC ${PROJECT_SOURCE_DIR})
   target_link_libraries(quazor_${name} PUBLIC ${ARG_DEPENDS})
   quazor_configure(quazor_${name})
-  if(QUAZOR_FUZZERS)
-    target_compile_options(quazor_${name} PRIVATE -fsanitize=fuzzer-no-link)  # a fuzzer finds its way by what has run
+  # A fuzzer finds its way by what has run. Beside tests, it only has to start: counting takes a quarter of a compilation.
+  if(QUAZOR_FUZZERS AND NOT QUAZOR_TESTS)
+    target_compile_options(quazor_${name} PRIVATE -fsanitize=fuzzer-no-link)
   endif()
+  file(RELATIVE_PATH folder ${PROJECT_SOURCE_DIR} ${CMAKE_CURRENT_SOURCE_DIR})
   # The host and what reads or writes JSON wait for hardware and disks: optimising them fully takes a third of the
   # build's time, and nobody feels it.
   if(name MATCHES "^host_" OR "nlohmann_json::nlohmann_json" IN_LIST ARG_DEPENDS)
     quazor_precompile(quazor_${name} json ${QUAZOR_COMMON_HEADERS} <nlohmann/json.hpp>)
     target_compile_options(quazor_${name} PRIVATE $<$<CONFIG:Release>:-O1> $<$<CONFIG:Debug>:-O0>)
+  elseif(folder MATCHES "^tests")
+    quazor_precompile(quazor_${name} json ${QUAZOR_COMMON_HEADERS} <nlohmann/json.hpp>)
   else()
     quazor_precompile(quazor_${name} plain ${QUAZOR_COMMON_HEADERS})
+  endif()
+  if(folder MATCHES "^(tests|host/testing)")
+    quazor_compile_quickly(quazor_${name})
   endif()
 endfunction()
 
@@ -127,6 +134,20 @@ function(quazor_plugin name)
                         LIBRARY_OUTPUT_DIRECTORY ${PROJECT_BINARY_DIR}/${QUAZOR_PLUGIN_DIRECTORY})
 endfunction()
 
+# For tests and what only they use: what is seldom run is compiled quickly.
+function(quazor_compile_quickly target)
+  target_compile_options(${target} PRIVATE $<$<CONFIG:Debug>:-O0>)
+  # Checks of undefined behaviour take a third of the time in which clang compiles tests, so only the product has them, and
+  # tests that instantiate its templates.
+  file(RELATIVE_PATH folder ${PROJECT_SOURCE_DIR} ${CMAKE_CURRENT_SOURCE_DIR})
+  if(QUAZOR_SANITIZE MATCHES undefined AND NOT folder MATCHES "^(contract|platform|base)")
+    target_compile_options(${target} PRIVATE -fno-sanitize=undefined)
+  endif()
+  if(QUAZOR_SANITIZE)
+    target_compile_options(${target} PRIVATE -g0)  # a report names the test's function, and the product's lines
+  endif()
+endfunction()
+
 # quazor_test(NAME SOURCES ... DEPENDS ...): a GoogleTest program and its CTest entry.
 function(quazor_test name)
   if(NOT QUAZOR_TESTS)
@@ -137,16 +158,7 @@ function(quazor_test name)
   target_include_directories(${name} PRIVATE ${PROJECT_SOURCE_DIR})
   target_link_libraries(${name} PRIVATE ${ARG_DEPENDS} GTest::gmock GTest::gtest_main)
   quazor_configure(${name})
-  target_compile_options(${name} PRIVATE $<$<CONFIG:Debug>:-O0>)
-  # Checks of undefined behaviour take a third of the time in which clang compiles tests, so only the product has them, and
-  # tests that instantiate its templates.
-  file(RELATIVE_PATH folder ${PROJECT_SOURCE_DIR} ${CMAKE_CURRENT_SOURCE_DIR})
-  if(QUAZOR_SANITIZE MATCHES undefined AND NOT folder MATCHES "^(contract|platform|base)")
-    target_compile_options(${name} PRIVATE -fno-sanitize=undefined)
-  endif()
-  if(QUAZOR_SANITIZE)
-    target_compile_options(${name} PRIVATE -g0)  # a report names the test's function, and the product's lines
-  endif()
+  quazor_compile_quickly(${name})
   quazor_precompile(${name} test ${QUAZOR_COMMON_HEADERS} <gmock/gmock.h> <gtest/gtest.h> <nlohmann/json.hpp>)
   set_target_properties(${name} PROPERTIES RUNTIME_OUTPUT_DIRECTORY ${PROJECT_BINARY_DIR}/tests)
   add_test(NAME ${name} COMMAND ${name} --gtest_brief=1)

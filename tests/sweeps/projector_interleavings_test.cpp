@@ -120,7 +120,7 @@ const std::vector<FrameKind> kAllBad(kFrameKinds.begin() + 1, kFrameKinds.end())
 
 // The timeout expires after everything else: the frames race with each other and with the host.
 TEST_F(ProjectorInterleavings, WithATimeoutAfterAllFrames) {
-  forEachPlan(triesAll() ? 4 : 3, kOneOfEach, [this](const ProjectorPlan& plan) { tryEveryOrder(plan); });
+  forEachPlan(isThorough() ? 4 : 3, kOneOfEach, [this](const ProjectorPlan& plan) { tryEveryOrder(plan); });
 }
 
 ProjectorPlan withTimeoutAtAnyMoment(ProjectorPlan plan) {
@@ -136,7 +136,7 @@ TEST_F(ProjectorInterleavings, WithATimeoutAtAnyMoment) {
 
 TEST_F(ProjectorInterleavings, WithMoreFramesABadOneAndATimeoutAtAnyMoment) {
   ProjectorPlan plan;
-  plan.deliveries = frames(triesAll() ? 4 : 3, 2, FrameKind::kUnlit);
+  plan.deliveries = frames(isThorough() ? 4 : 3, 2, FrameKind::kUnlit);
   plan.stopCount = 3;
   tryEveryOrder(withTimeoutAtAnyMoment(plan));
 }
