@@ -395,8 +395,8 @@ void declareOtherCommands(CLI::App& app, RawOptions& raw) {
   addPlugins(doctor, raw);
   addParameterOptions(doctor, raw);
   addProcessOptions(doctor, raw);
-  CLI::App& selftest = *app.add_subcommand(
-      "selftest", "Run the diagnostics on the installed simulated phones and report which faults they detect");
+  CLI::App& selftest =
+      *app.add_subcommand("selftest", "Run the diagnostics on phones with known faults and report which they detect");
   addNames(selftest, raw.names, "A phone's");
   selftest.add_option("--seeds", raw.seeds, "Number of seeds (event orders) to try on each phone; default 3")
       ->type_name("N");

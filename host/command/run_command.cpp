@@ -221,7 +221,7 @@ ChosenPhone choosePhone(const Options& options, const Installation& installation
     const std::filesystem::path file = installation.binding(*binding);
     requirePhone(file, options, installation);
     const auto make = [phones = phonesOfBinding(file)](std::uint64_t /*seed*/) { return phones; };
-    return {std::string(kLinuxPrefix) + file.string(), make, absentOnBinding(file)};
+    return {std::string(kLinuxPrefix) + file.string(), make, summaryOfBinding(file).absent};
   }
   const std::filesystem::path scenario =
       options.phone.empty() ? installation.defaultScenario() : installation.scenario(options.phone);

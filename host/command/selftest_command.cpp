@@ -32,6 +32,20 @@ std::vector<Profile> profilesIn(const std::filesystem::path& file, const Install
   return profiles;
 }
 
+// Like wantedScenarios(); bindings come last, each once.
+std::vector<std::string> wantedPhones(const std::vector<std::string>& names, const Installation& installation) {
+  std::vector<std::string> simulated;
+  std::vector<std::string> real;
+  for (const std::string& name : names) {
+    std::vector<std::string>& kind = bindingNamed(name) ? real : simulated;
+    if (std::find(kind.begin(), kind.end(), name) == kind.end()) kind.push_back(name);
+  }
+  if (simulated.empty() && !real.empty()) return real;
+  std::vector<std::string> wanted = wantedScenarios(simulated, installation);
+  wanted.insert(wanted.end(), real.begin(), real.end());
+  return wanted;
+}
+
 // A profile with those that it is based on, and what it was used for.
 struct Judge {
   std::string name;
@@ -114,9 +128,11 @@ class Selftest {
     std::string name;
     std::filesystem::path file;
     ScenarioSummary summary;
+    bool isReal = false;  // the machine of a binding
   };
 
   struct HealthyRun {
+    std::filesystem::path phone;
     std::string name;
     DiagnosticRecord record;
   };
@@ -129,18 +145,35 @@ class Selftest {
   // The phones with an expected outcome. Those that cannot be run are told and added to `refused`.
   std::vector<WantedPhone> readPhones(std::vector<RefusedPhone>& refused) {
     std::vector<WantedPhone> phones;
-    for (const std::string& name : wantedScenarios(options_.names, installation_)) {
-      const std::filesystem::path file = installation_.scenario(name);
+    for (const std::string& name : wantedPhones(options_.names, installation_)) {
+      const std::optional<std::filesystem::path> binding = bindingNamed(name);
+      const std::filesystem::path file = binding ? installation_.binding(*binding) : installation_.scenario(name);
       try {
-        ScenarioSummary summary = summaryOfScenario(file, installation_.scenarioSource());
+        ScenarioSummary summary =
+            binding ? summaryOfBinding(file) : summaryOfScenario(file, installation_.scenarioSource());
         leaveOutInherited(summary, file);
-        if (!summary.expected.empty()) phones.push_back({name, file, std::move(summary)});
+        if (!summary.expected.empty()) phones.push_back({name, file, std::move(summary), binding.has_value()});
       } catch (const InputError& problem) {
         err_ << "quazor: REFUSED phone " << printable(name) << ": " << printable(problem.what()) << '\n';
         refused.push_back({name, problem.what()});
       }
     }
+    const auto healthy = std::find_if(phones.begin(), phones.end(), [](const WantedPhone& one) {
+      return one.isReal && !one.summary.hasFaults && mustPass(one.summary);
+    });
+    if (healthy != phones.end()) healthyMachine_ = healthy->file;
     return phones;
+  }
+
+  static bool mustPass(const ScenarioSummary& summary) {
+    return std::all_of(summary.expected.begin(), summary.expected.end(),
+                       [](const ExpectedOutcome& one) { return one.verdict == nameOf(Verdict::kPass); });
+  }
+
+  // The phone that the others of its kind are compared with. Of real ones, it is the first that must pass and declares
+  // no fault; empty if there is none.
+  std::filesystem::path healthyFor(const WantedPhone& phone) const {
+    return phone.isReal ? healthyMachine_ : installation_.defaultScenario();
   }
 
   // Whoever bases a phone on another one need not load the diagnostics of that one: removes what is expected of
@@ -178,14 +211,12 @@ class Selftest {
   };
 
   // A phone whose own file says that it passes, and that declares no fault, is no fault.
-  static PhoneKind kindOf(const WantedPhone& wanted, bool isDefault) {
-    if (isDefault) return PhoneKind::kHealthy;
+  PhoneKind kindOf(const WantedPhone& wanted) const {
+    if (wanted.file == healthyFor(wanted)) return PhoneKind::kHealthy;
     const std::vector<ExpectedOutcome>& expected = wanted.summary.expected;
-    const bool mustPass = std::all_of(expected.begin(), expected.end(),
-                                      [](const ExpectedOutcome& one) { return one.verdict == nameOf(Verdict::kPass); });
     const bool saysSo = std::any_of(expected.begin(), expected.end(),
                                     [&wanted](const ExpectedOutcome& one) { return isNamedIn(wanted.file, one); });
-    return mustPass && saysSo && !wanted.summary.hasFaults ? PhoneKind::kChanged : PhoneKind::kFaulty;
+    return mustPass(wanted.summary) && saysSo && !wanted.summary.hasFaults ? PhoneKind::kChanged : PhoneKind::kFaulty;
   }
 
   // The diagnostics that `run --all` runs on the phone besides those of which its file expects something.
@@ -212,15 +243,17 @@ class Selftest {
 
   // Adds the rows of the phone and its detection. Returns false if it was interrupted; then it adds nothing.
   bool performPhone(const WantedPhone& wanted, SelftestOutcome& outcome) {
-    const auto& [name, file, summary] = wanted;
-    PhoneDetection phone{name, summary.title, kindOf(wanted, file == installation_.defaultScenario())};
+    const ScenarioSummary& summary = wanted.summary;
+    PhoneDetection phone{wanted.name, summary.title, kindOf(wanted)};
     std::vector<SelftestRow> rows;
     for (const ExpectedOutcome& expected : summary.expected) {
-      rows.push_back({name, expected, 0, 0, 0, {}, {}});
+      rows.push_back({wanted.name, expected, 0, 0, 0, {}, {}});
       if (expected.verdict != nameOf(Verdict::kPass)) phone.isExpected = true;
     }
     std::vector<ExpectedOutcome> wantedRuns = summary.expected;
-    if (phone.kind != PhoneKind::kChanged) {  // of the other diagnostics its file does not say that they pass
+    // Of the other diagnostics the file of a changed phone does not say that they pass, and a real one may lack their
+    // hardware.
+    if (phone.kind != PhoneKind::kChanged && !wanted.isReal) {
       for (ExpectedOutcome& other : othersFor(summary)) wantedRuns.push_back(std::move(other));
     }
     std::vector<ProfileRuns> profiles{{default_, phone.byDefault}};
@@ -229,12 +262,13 @@ class Selftest {
       for (std::size_t i = 0; i < wantedRuns.size(); ++i) {
         const ExpectedOutcome& expected = wantedRuns[i];
         const bool isNamed = i < rows.size();
-        const DiagnosticRecord record = run(file, expected, seed, default_.profiles);
+        const DiagnosticRecord record = run(wanted, expected, seed, default_.profiles);
         if (isInterrupted()) return false;
         if (isNamed) count(rows[i], record);
         for (ProfileRuns& one : profiles) {
-          DiagnosticRecord judged = recordBy(one.judge, file, expected, record);
-          const bool isAlarm = judged.verdict != Verdict::kPass && (isNamed || isNews(phone.kind, expected, one.judge));
+          DiagnosticRecord judged = recordBy(one.judge, wanted, expected, record);
+          const bool isAlarm =
+              judged.verdict != Verdict::kPass && (isNamed || isNews(phone.kind, wanted, expected, one.judge));
           if (isInterrupted()) return false;
           if (isAlarm) one.alarms.push_back(alarmText(judged));
           noteResults(one.judge.measured, judged);
@@ -266,19 +300,19 @@ class Selftest {
   }
 
   // The run by the profile. One whose parameters the profile does not change is only judged again.
-  DiagnosticRecord recordBy(const Judge& judge, const std::filesystem::path& file, const ExpectedOutcome& expected,
+  DiagnosticRecord recordBy(const Judge& judge, const WantedPhone& wanted, const ExpectedOutcome& expected,
                             const DiagnosticRecord& record) {
     if (expected.experimentOnly) return record;
     if (haveSameValues(parametersOf(find(expected), expected, judge.profiles), record.parameters)) {
       return judgedWith(record, judge.limits);
     }
-    return judgedWith(run(file, expected, record.seed, judge.profiles), judge.limits);
+    return judgedWith(run(wanted, expected, record.seed, judge.profiles), judge.limits);
   }
 
   // A diagnostic that does not pass on the healthy phone either says nothing about another one.
-  bool isNews(PhoneKind kind, const ExpectedOutcome& expected, const Judge& judge) {
+  bool isNews(PhoneKind kind, const WantedPhone& wanted, const ExpectedOutcome& expected, const Judge& judge) {
     if (kind == PhoneKind::kHealthy) return true;
-    const std::optional<DiagnosticRecord> healthy = healthyRun(expected, judge);
+    const std::optional<DiagnosticRecord> healthy = healthyRun(wanted, expected, judge);
     return !healthy || healthy->verdict == Verdict::kPass;
   }
 
@@ -288,7 +322,7 @@ class Selftest {
     if (runs.detection.found > 0) return {"whether it is detected depends on the order of simultaneous events"};
     std::vector<std::string> reasons;
     for (std::size_t i = 0; i < wantedRuns.size(); ++i) {
-      const std::optional<DiagnosticRecord> healthy = healthyRun(wantedRuns[i], runs.judge);
+      const std::optional<DiagnosticRecord> healthy = healthyRun(wanted, wantedRuns[i], runs.judge);
       if (!healthy) return {"there is no healthy phone to compare it with"};
       if (runs.records[i].verdict != Verdict::kPass) {
         reasons.push_back(wantedRuns[i].name + " does not pass on the healthy phone either");
@@ -305,17 +339,20 @@ class Selftest {
     return reasons;
   }
 
-  // The same run, with the first seed, on the healthy phone, by the profile; nothing if there is none. Each is run
-  // once.
-  std::optional<DiagnosticRecord> healthyRun(const ExpectedOutcome& expected, const Judge& judge) {
-    const std::filesystem::path file = installation_.defaultScenario();
-    if (!std::filesystem::exists(file)) return std::nullopt;
+  // The same run, with the first seed, on the healthy phone of its kind, by the profile; nothing if there is none. Each
+  // is run once.
+  std::optional<DiagnosticRecord> healthyRun(const WantedPhone& wanted, const ExpectedOutcome& expected,
+                                             const Judge& judge) {
+    const WantedPhone healthy{{}, healthyFor(wanted), {}, wanted.isReal};
+    if (!std::filesystem::exists(healthy.file)) return std::nullopt;
     const ResolvedParameters parameters = parametersOf(find(expected), expected, judge.profiles);
     auto known = std::find_if(healthyRuns_.begin(), healthyRuns_.end(), [&](const HealthyRun& one) {
-      return one.name == expected.name && haveSameValues(one.record.parameters, parameters);
+      return one.phone == healthy.file && one.name == expected.name &&
+             haveSameValues(one.record.parameters, parameters);
     });
     if (known == healthyRuns_.end()) {
-      known = healthyRuns_.insert(healthyRuns_.end(), {expected.name, run(file, expected, 0, judge.profiles)});
+      known = healthyRuns_.insert(healthyRuns_.end(),
+                                  {healthy.file, expected.name, run(healthy, expected, 0, judge.profiles)});
     }
     return expected.experimentOnly ? known->record : judgedWith(known->record, judge.limits);
   }
@@ -362,12 +399,13 @@ class Selftest {
     return resolveParameters(described, {}, settings);
   }
 
-  DiagnosticRecord run(const std::filesystem::path& file, const ExpectedOutcome& expected, std::uint64_t seed,
+  DiagnosticRecord run(const WantedPhone& phone, const ExpectedOutcome& expected, std::uint64_t seed,
                        const std::vector<Profile>& profiles) {
     const DescribedDiagnostic& described = find(expected);
     const ResolvedParameters parameters = parametersOf(described, expected, profiles);
     RunOptions runOptions;
-    runOptions.makePhone = phonesOfScenario(file, false, seed, installation_.scenarioSource());
+    runOptions.makePhone = phone.isReal ? phonesOfBinding(phone.file)
+                                        : phonesOfScenario(phone.file, false, seed, installation_.scenarioSource());
     runOptions.logLevel = LogLevel::kError;
     runOptions.logLimit = options_.logLimit;
     return recordOfRun(described, parameters, runOptions, seed, isolation_, signals_);
@@ -382,6 +420,7 @@ class Selftest {
   Judge default_;
   std::optional<Judge> strict_;
   WatchedSignals* const signals_;
+  std::filesystem::path healthyMachine_;
   std::vector<HealthyRun> healthyRuns_;
 };
 

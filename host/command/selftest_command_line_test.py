@@ -23,6 +23,72 @@ FOUND_BY_OTHERS = ("projector_fault/fault_events_before_streaming", "projector_f
 FOUND_BY_OTHERS_WITH_STRICT = ("projector_fault/frames_dropped", "projector_fault/start_delayed")
 
 
+def real_phone(expected, **others):
+    """A binding without cameras, whose file expects this of a diagnostic that needs one."""
+    return {"title": "No camera", "expect": {"SingleCameraDiagnostic": expected}, **others}
+
+
+NO_CAMERA = {"verdict": "error", "error": {"domain": "SingleCameraErrorDomain", "code": 1,
+                                           "message": "There is no capture device."}}
+
+
+class RealPhoneTest(CommandLineTest):
+    def judged(self, phones, *names, code):
+        for name, phone in phones.items():
+            (self.directory / name).write_text(json.dumps(phone))
+        result = quazor("selftest", *(f"linux:{self.directory / name}" for name in [*phones, *names]), "--seeds", "2",
+                        "--format", "json")
+        self.assertEqual(result.returncode, code, result.stderr)
+        document = json.loads(result.stdout) if result.stdout else None
+        return document, result.stderr
+
+    def test_a_fault_of_a_real_phone_is_detected(self):
+        document, errors = self.judged({"none.json": real_phone(NO_CAMERA)}, code=0)
+        self.assertEqual(errors, "")
+        row, = document["rows"]
+        self.assertEqual((row["name"], row["runs"], row["asExpected"], row["outcome"]),
+                         ("SingleCameraDiagnostic", 2, 2, "detected"))
+        self.assertEqual([(one["kind"], one["default"]["detected"]) for one in document["phones"]], [("faulty", 2)])
+
+    def test_what_must_pass_and_does_not_is_a_false_alarm(self):
+        document, _ = self.judged({"first.json": real_phone({"verdict": "pass"}),
+                                   "second.json": real_phone({"verdict": "pass"})}, code=1)
+        self.assertEqual([row["outcome"] for row in document["rows"]], ["false alarm"] * 2)
+        # The others are compared with the first.
+        self.assertEqual([one["kind"] for one in document["phones"]], ["healthy", "changed"])
+        self.assertEqual(document["totals"]["default"]["falseAlarms"], 2)
+
+    def test_only_what_the_file_names_is_run(self):
+        document, _ = self.judged({"none.json": real_phone(NO_CAMERA)}, code=0)
+        self.assertEqual(document["phones"][0]["default"]["reasons"], [])
+        self.assertEqual(len(document["rows"]), 1)
+
+    def test_a_fault_that_never_fires_is_invalid(self):
+        fault = {"operation": "CapturePlugIn.device", "occurrence": 99, "action": "nothing"}
+        document, _ = self.judged({"never.json": real_phone(NO_CAMERA, faults=[fault])}, code=1)
+        self.assertEqual([row["outcome"] for row in document["rows"]], ["invalid"])
+
+    def test_mistakes_are_refused_and_the_others_are_run(self):
+        wrong = real_phone({"verdict": "perfect"})
+        document, errors = self.judged({"none.json": real_phone(NO_CAMERA), "wrong.json": wrong}, "missing.json", code=66)
+        self.assertEqual(len(document["rows"]), 1)
+        self.assertIn("wrong.json:1: expect.SingleCameraDiagnostic.verdict: ", errors)
+        self.assertIn("missing.json: the file does not exist", errors)
+        self.assertIn("2 of 3 phones were refused", errors)
+
+    def test_a_binding_that_expects_nothing_is_not_tested(self):
+        document, errors = self.judged({"none.json": {"title": "No camera"}}, code=66)
+        self.assertIsNone(document)
+        self.assertIn("no phone has an expected outcome", errors)
+
+    def test_beside_simulated_phones(self):
+        (self.directory / "none.json").write_text(json.dumps(real_phone(NO_CAMERA)))
+        result = quazor("selftest", f"linux:{self.directory / 'none.json'}", REFUSED, "--seeds", "1", "--format", "json")
+        self.assertEqual(result.returncode, 0, result.stderr)
+        self.assertEqual([one["phone"] for one in json.loads(result.stdout)["phones"]],
+                         [REFUSED, f"linux:{self.directory / 'none.json'}"])
+
+
 class SelftestTest(CommandLineTest):
     def test_a_fault_that_its_file_expects_to_pass_is_a_blind_spot_with_the_reasons_of_each_profile(self):
         result = quazor("selftest", "healthy", DROPPED, REFUSED, "--seeds", "1")

@@ -82,13 +82,14 @@ ScenarioFile readScenarioFile(const std::filesystem::path& file, const ScenarioS
 
 struct BindingFile {
   Binding binding;
+  std::vector<ExpectedOutcome> expected;
   std::vector<SkipRule> absent;
 };
 
 BindingFile readBindingFile(const std::filesystem::path& file) {
   Binding binding = readBinding(file);
   const JsonDocument document = JsonDocument::read(file);
-  return {std::move(binding), readAbsent(JsonCursor(document))};
+  return {std::move(binding), readExpectedOutcomes(JsonCursor(document)), readAbsent(JsonCursor(document))};
 }
 
 }  // namespace
@@ -118,10 +119,6 @@ PhoneMaker phonesOfBinding(const std::filesystem::path& file) {
       [binding = read(readBindingFile, file, kOfBinding).binding] { return std::make_unique<PhoneOfBinding>(binding); };
 }
 
-std::vector<SkipRule> absentOnBinding(const std::filesystem::path& file) {
-  return read(readBindingFile, file, kOfBinding).absent;
-}
-
 PhoneProbe probeThisMachine() {
   MachineProbe probe = probeMachine(sourcesOfRunningSystem());
   return {std::move(probe.lines), std::move(probe.binding)};
@@ -138,6 +135,11 @@ ScenarioSummary summaryOfScenario(const std::filesystem::path& file, const Scena
   ScenarioFile read = quazor::read(readIt, file);
   return {read.scenario.title, std::move(read.expected), !read.scenario.faults.empty(), std::move(read.absent),
           std::move(read.scenario.bases)};
+}
+
+ScenarioSummary summaryOfBinding(const std::filesystem::path& file) {
+  BindingFile read = quazor::read(readBindingFile, file, kOfBinding);
+  return {read.binding.title, std::move(read.expected), !read.binding.faults.empty(), std::move(read.absent)};
 }
 
 }  // namespace quazor

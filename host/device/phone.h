@@ -64,9 +64,7 @@ PhoneMaker phonesOfScenario(const std::filesystem::path& file, bool realTime, st
 SeededPhoneMaker seededPhonesOfScenario(const std::filesystem::path& file, bool realTime,
                                         const ScenarioSource& find = nullptr);
 
-// What the phone of a binding file cannot run. Throws like phonesOfBinding.
-std::vector<SkipRule> absentOnBinding(const std::filesystem::path& file);
-
+// What the host reads of a phone's file.
 struct ScenarioSummary {
   std::string title;
   std::vector<ExpectedOutcome> expected;
@@ -101,5 +99,8 @@ std::shared_ptr<LogBackend> systemLogOfThisMachine();
 
 // The summary of a scenario file. Throws a CommandError (kCannotRead) when the file cannot be read.
 ScenarioSummary summaryOfScenario(const std::filesystem::path& file, const ScenarioSource& find = nullptr);
+
+// The same of a binding file.
+ScenarioSummary summaryOfBinding(const std::filesystem::path& file);
 
 }  // namespace quazor

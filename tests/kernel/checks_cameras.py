@@ -1,5 +1,7 @@
 """Checks of the steps that stream cameras."""
 
+import json
+
 from arrived import expect, expect_equal, underlying
 from kernel_trace import gaps_in, read_trace
 
@@ -112,6 +114,23 @@ def expect_not_controlled(step, label, code, words):
     step.ended_in_error(label, CAPTURE, 214, "Failed to synchronize cameras!")
     log = " ".join(line["text"] for line in step.ran(label)["log"])
     expect(f"{LINUX} code {code}:" in log and words in log, f"the log does not say why: {log}")
+
+
+def selftest_cameras(step):
+    expect_equal("the errors of the self-test", step.text("selftest.stderr"), "")
+    expect_equal("the exit code of the self-test", step.exit_code("selftest"), 0)
+    document = json.loads(step.out("selftest"))
+    found = {phone["phone"].rpartition("/")[2]: (phone["kind"], phone["default"]["detected"], phone["strict"]["detected"])
+             for phone in document["phones"]}
+    expect_equal("what the self-test finds", found, {
+        "healthy.json": ("healthy", 0, 0), "start_late.json": ("faulty", 0, 1), "start_refused.json": ("faulty", 1, 1),
+        "never_stops.json": ("faulty", 0, 0)})
+    fired = [row["faultsFired"] for row in document["rows"]]
+    expect_equal("how often each fault fired", fired, [[], [1], [1], [1]])
+    expect("FrontInfrared.FrameOffset is 3" in " ".join(document["phones"][1]["default"]["reasons"]),
+           f"the blind spot has no reason: {document['phones'][1]}")
+    expect("1 of 1 faults detected, 0 blind spots, 0 false alarms" in step.out("matrix"),
+           f"the matrix is {step.out('matrix')}")
 
 
 def refused_start(call):

@@ -34,6 +34,8 @@ STEPS = [
     Step("damaged_buffer", "a damaged buffer is counted, and is no frame", cameras.damaged_buffer),
     Step("fatal_error", "a stream breaks down: counted", cameras.disturbed(StreamErrorCount=1)),
     Step("unbind", "the driver is unbound in mid-stream, and bound again", cameras.unbind),
+    Step("selftest_cameras", "the self-test finds faults that are added to a driver's calls",
+         cameras.selftest_cameras),
     Step("two_users", "a second user of a camera is refused; the first goes on", cameras.two_users),
     Step("nothing", "a machine without devices: a clear error each", host.nothing, boot=2),
     Step("simulated_phone", "the simulated phone passes on this kernel", host.simulated_phone, boot=2),

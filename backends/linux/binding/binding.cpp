@@ -272,7 +272,7 @@ FaultTargets targetsOf(const Binding& binding) {
 
 Binding bindingOf(const JsonCursor& document) {
   document.allowKeys({"$schema", "title", "description", "cameras", "groups", "counterFiles", "tracepoints", "display",
-                      "faults", "absent"});
+                      "faults", "absent", "expect"});
   checkRemark(document, "$schema");
   checkRemark(document, "description");
   Binding binding;
