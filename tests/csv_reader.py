@@ -7,7 +7,7 @@ import re
 import report_limits
 from report_readers import NO_LIMIT, Error, Limit, Result, number, whole
 
-CSV_HEADER = ("diagnostic,verdict,result,value,unit,limit,lower,lowerOpen,upper,upperOpen,resultVerdict,"
+CSV_HEADER = ("diagnostic,verdict,result,value,unit,limit,lower,lowerOpen,upper,upperOpen,severity,resultVerdict,"
               "errorStage,errorDomain,errorCode,errorMessage").split(",")
 
 
@@ -25,7 +25,7 @@ def csv_rows(content):
 
 def read_csv(rows, header):
     """Converts a diagnostic's lines to a record."""
-    if any(row[:2] != rows[0][:2] or row[11:] != rows[0][11:] for row in rows):
+    if any(row[:2] != rows[0][:2] or row[12:] != rows[0][12:] for row in rows):
         raise ValueError("lines of one diagnostic differ in what they say of it")
     first = dict(zip(CSV_HEADER, rows[0]))
     results = []
@@ -36,7 +36,7 @@ def read_csv(rows, header):
         flags = {"1": True, "0": False}
         bounds = [(number(it[which]), flags[it[which + "Open"]]) if it[which] else None for which in ("lower", "upper")]
         results.append(Result(it["result"], number(it["value"]), it["unit"], Limit(it["limit"], *bounds),
-                              it["resultVerdict"]))
+                              it["resultVerdict"], it["severity"]))
     errors = [Error(first["errorDomain"], int(first["errorCode"]), first["errorMessage"])] if first["errorCode"] else []
     more = dict(zip(header[len(CSV_HEADER):], rows[0][len(CSV_HEADER):]))
     skip = (more.get("skipKind"), more.get("skipReason"))

@@ -20,6 +20,11 @@ VALIDATORS = {("lower", False): "GREATER_THAN_OR_EQUAL", ("lower", True): "GREAT
               ("upper", False): "LESS_THAN_OR_EQUAL", ("upper", True): "LESS_THAN"}
 
 
+def check_of(json):
+    """Reads a limit of JSON."""
+    return Check(*(json[key] for key in ("limit", "name", "severity", "source", "verdict")))
+
+
 def unquoted(name):
     """A name without its quotation marks."""
     if name is None or not name.startswith('"'):
@@ -87,6 +92,8 @@ def verdict_of(check, result, results):
     passed = compared(check, result, results)
     if passed:
         return "pass"
+    if passed is None and result.verdict == "error":
+        return "skip"
     return "error" if passed is None and check.severity == "fail" else check.severity
 
 
@@ -109,7 +116,8 @@ def rows_of(record, limit_of, name_of=None):
         for check in checks:
             label = label_of(check)
             name = name_of(one.name, label) if name_of else one.name
-            rows.append(one._replace(name=name, limit=limit_of(label, *bounds_of(check)), verdict=check.verdict))
+            rows.append(one._replace(name=name, limit=limit_of(label, *bounds_of(check)), verdict=check.verdict,
+                                     severity=check.severity))
     return rows
 
 
@@ -117,7 +125,7 @@ def rows_of(record, limit_of, name_of=None):
 
 
 def expected_of_ocp(record):
-    """Per result its validators and what is said of each limit: a diagnosis, or a warning."""
+    """Per result its validators, what is said of each limit, a diagnosis or a warning, and the limits themselves."""
     known = record["verdict"] != "error"
     expected = []
     for checks in record["checks"]:
@@ -125,10 +133,10 @@ def expected_of_ocp(record):
         for check in checks:
             label = label_of(check)
             bounds = zip(("lower", "upper"), bounds_of(check))
-            if check.severity == "fail" and check.verdict != "error":
+            if check.severity == "fail" and check.verdict not in ("error", "skip"):
                 validators += [(label, VALIDATORS[which, bound[1]], bound[0]) for which, bound in bounds if bound]
             said.append((check.verdict if known or check.verdict == "warn" else "unknown", label))
-        expected.append((validators, said))
+        expected.append((validators, said, checks))
     return expected
 
 
@@ -139,8 +147,10 @@ def read_ocp(artifacts):
     for one in artifacts:
         if "measurement" in one:
             name = one["measurement"]["name"]
+            checks = one["measurement"].get("metadata", {}).get("userLimits", [])
             found.append(([(each["name"], each["type"], repr(float(each["value"])))
-                           for each in one["measurement"].get("validators", []) if is_label(each["name"])], []))
+                           for each in one["measurement"].get("validators", []) if is_label(each["name"])], [],
+                          [check_of(each) for each in checks]))
         elif one.get("log", {}).get("severity") == "WARNING":
             found[-1][1].append(("warn", one["log"]["message"].partition(", limit ")[2]))
         elif is_of_limit(one, name):

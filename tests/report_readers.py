@@ -14,7 +14,7 @@ import report_limits
 VERDICTS = {("COMPLETE", "PASS"): "pass", ("COMPLETE", "FAIL"): "fail", ("ERROR", "NOT_APPLICABLE"): "error",
             ("SKIP", "NOT_APPLICABLE"): "skip"}
 
-Result = collections.namedtuple("Result", "name value unit limit verdict")
+Result = collections.namedtuple("Result", "name value unit limit verdict severity", defaults=[""])  # of a user's limit
 Limit = collections.namedtuple("Limit", "name lower upper")  # bounds are (value, open)
 Error = collections.namedtuple("Error", "domain code message")
 NO_LIMIT = Limit("", None, None)
@@ -93,8 +93,8 @@ def read_json(text):
                 Result(each["name"], number(each["value"]), each["unit"], limit_of(each["limit"]), each["verdict"])
                 for each in one.get("measuredResults", [])],
             "checks": [
-                [report_limits.Check(*(check[key] for key in ("limit", "name", "severity", "source", "verdict")))
-                 for check in each.get("userLimits", [])] for each in one.get("measuredResults", [])],
+                [report_limits.check_of(check) for check in each.get("userLimits", [])]
+                for each in one.get("measuredResults", [])],
             "measurements": [
                 (name, number(each["value"]), each["unit"]) for name, each in one["measurements"].items()],
             "errors": errors_of(one["error"]),
@@ -224,8 +224,9 @@ def junit_result(case, verdict_of_suite):
         return (number(it[which]), {"true": True, "false": False}[it[which + "Open"]]) if which in it else None
 
     limit = Limit(it["limit"], bound("lower"), bound("upper")) if "limit" in it else None
-    result = Result(case.get("name"), number(it["value"]), it["unit"], limit, it["verdict"])
-    allowed = {"pass": [], "none": [], "warn": [], "fail": ["failure"], "error": ["error"]}[result.verdict]
+    result = Result(case.get("name"), number(it["value"]), it["unit"], limit, it["verdict"], it.get("severity", ""))
+    allowed = {"pass": [], "none": [], "warn": [], "fail": ["failure"], "error": ["error"],
+               "skip": ["skipped"]}[result.verdict]
     finite = all(math.isfinite(float(it[key])) for key in ("value", "lower", "upper") if key in it)
     if result.verdict in ("pass", "fail") and not finite:
         raise ValueError(f"{result} cannot be judged")
@@ -269,7 +270,7 @@ def read_junit(suite):
         "summary": it["summary"],
         "verdict": it["verdict"],
         "skip": next(((one.get("name"), one.find("skipped").get("message")) for one in cases
-                      if one.find("skipped") is not None), None),
+                      if one.find("skipped") is not None and "value" not in properties_of(one)), None),
         "results": [junit_result(one, it["verdict"]) for one in cases if "value" in properties_of(one)],
         "parameters": {half: {key[len(f"parameter.{half}."):]: number(value) for key, value in it.items()
                               if key.startswith(f"parameter.{half}.")} for half in ("experiment", "analysis")},
@@ -364,7 +365,7 @@ def readable(cell):
 def table_of(lines):
     """The rows of a table whose second column is a right-aligned number."""
     header = lines[0].decode()
-    begins = [header.index(word) for word in ("Unit", "Limit", "Verdict") if word in header]
+    begins = [header.index(word) for word in ("Unit", "Limit", "Severity", "Verdict") if word in header]
     rows = []
     for line in lines[1:]:
         first, *others = columns_of(line, [2, *begins])
@@ -415,8 +416,9 @@ def read_text(lines, expected):
     record["summary"] = [line.decode("utf-8", "replace") for line in lines.block()]
     record["results"], record["measurements"] = [], []
     if expected["results"]:
-        record["results"] = [Result(name, value, unit, text_limit(limit), verdict.replace("-", "none"))
-                             for name, value, unit, limit, verdict in table_of(lines.block())]
+        record["results"] = [Result(name, value, unit, text_limit(limit), verdict.replace("-", "none"),
+                                    "".join(severity).replace("-", ""))
+                             for name, value, unit, limit, *severity, verdict in table_of(lines.block())]
     if expected["measurements"]:
         record["measurements"] = [tuple(row) for row in table_of(lines.block())]
     if expected["auxiliaryData"]:

@@ -41,7 +41,7 @@ KINDS = {"a diagnostic: pass", "a diagnostic: fail", "a diagnostic: error", "a d
          "no results", "many results", "a deep error", "a value that is not finite", "a limit without bounds",
          "a result: pass", "a result: fail", "a result: error", "a result: none",
          *(f"a {kind}, {severity}: {verdict}" for kind in ("number", "interval", "relation")
-           for severity, verdicts in (("fail", ("pass", "fail", "error")), ("warn", ("pass", "warn")))
+           for severity, verdicts in (("fail", ("pass", "fail", "error", "skip")), ("warn", ("pass", "warn", "skip")))
            for verdict in verdicts),
          "a record with bytes that are no text", "a tolerance", "a tolerance without a bound", "a unit",
          "a limit on a value that is not finite", *(f"a text with {sign!r}" for sign in SIGNS)}
@@ -149,6 +149,20 @@ def text_end(records, of_experiments, interrupted, run, never_began):
         yield f"{end} {running} was running."
 
 
+def with_interrupted(records, interrupted, run):
+    """The records in the text and the CSV of an analysis, which have what the recorded run stopped in."""
+    if not interrupted or "analyzed" not in run or has_interruption(records):
+        return records
+    error = INTERRUPTION._replace(message=f"{interrupted} was interrupted")
+    return [*records, {"name": interrupted, "summary": "The recorded run stopped while this was running.", "verdict": "error",
+                       "skip": None, "attempt": None, "repetition": None, "trial": "", "results": [], "checks": [],
+                       "measurements": [], "errors": [error], "seed": run["seed"], "auxiliaryData": {}, "error stage": ""}]
+
+
+def has_interruption(records):
+    return bool(records) and records[-1]["errors"][:1] == [INTERRUPTION]
+
+
 def run_verdict(records, accepts_flaky):
     """The verdict of a run, from its last attempts."""
     verdicts = {"error" if one["verdict"] in ("pass", "fail") and (one["attempt"] or 1) > 1 and not accepts_flaky
@@ -217,10 +231,11 @@ class Comparison:
         self.check_identity(name, identity, streams, suites)
         rows = csv_reader.csv_rows(reports["csv"])
         seeds = self.without_identity(name, rows, identity)
+        never_began = sum(one.end["status"] == "SKIP" for one in streams[len(records):])
+        records = with_interrupted(records, interrupted, run)
         self.check(f"{name} csv: seeds", seeds, [str(one["seed"]) for one in records
                                                  for _ in range(csv_reader.lines_of(one, of_experiments))])
         self.compare_csv(name, rows, of_experiments, records)
-        never_began = sum(one.end["status"] == "SKIP" for one in streams[len(records):])
         end = list(text_end(records, of_experiments, interrupted, run, never_began))
         varies = any(one["varying"] for one in json.loads(reports["json"]).get("variation", []))
         lines = report_readers.Lines(reports["text"])
@@ -343,7 +358,7 @@ class Comparison:
                    [in_xml(one.start["name"]) for one in streams])
         ends = [{"ERROR": "error", "SKIP": None}[one.end["status"]] for one in streams]
         self.check(f"{name}: unrecorded verdicts", [report_readers.derived_verdict(one) for one in suites], ends)
-        has_record = bool(records) and records[-1]["errors"][:1] == [INTERRUPTION]
+        has_record = has_interruption(records)
         expected = int(interrupted is not None and not has_record)
         self.check(f"{name}: interrupted ones without a record", ends.count("error"), expected)
         if expected:

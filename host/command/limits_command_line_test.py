@@ -3,7 +3,7 @@
 import json
 import unittest
 
-from command_line_fixture import CommandLineTest, WORKING, events_in, quazor
+from command_line_fixture import PLUGINS, CommandLineTest, WORKING, events_in, quazor
 
 
 class LimitsTest(CommandLineTest):
@@ -37,13 +37,29 @@ class LimitsTest(CommandLineTest):
                 self.assertEqual(found[2][0]["userLimits"][0]["source"], "command line")
 
     def test_a_limit_without_a_result_is_an_error(self):
-        for limit in (f"{self.name}x > 0", f"Nowhere:{self.name} > 0"):
+        for limit in (f"{self.name}x > 0", f"Fake.Two:{self.name} > 0"):
             with self.subTest(limit=limit):
                 record = self.directory / "record.jsonl"
                 done = self.run_limited("--limit", limit, "--record", record, "--replace")
                 self.assertEqual(done.returncode, 2, done.stdout)
                 self.assertIn(f"code 14: the limit '{limit}' (command line) was compared with nothing", done.stdout)
                 self.assertEqual(quazor("verify", record).returncode, 0)
+
+    def test_a_limit_for_an_unknown_diagnostic_is_refused_before_anything_runs(self):
+        record = self.directory / "record.jsonl"
+        for name, suggestion in (("Nowhere", ""), ("Fake.Oen", "; did you mean 'Fake.One'?"), ("Nowhere.*", ""),
+                                 ("Fake", "; did you mean 'Fake*'?")):
+            with self.subTest(name=name):
+                done = self.run_limited("--limit", f"{name}:A > 0", "--record", record)
+                self.assert_refused(done, 64, f"--limit '{name}:A > 0': no diagnostic has the name '{name}'{suggestion}\n")
+                self.assertFalse(record.exists())
+        # A plug-in that cannot be loaded may have the diagnostic.
+        done = self.run_limited("--limit", "Nowhere:A > 0", "--plugin", PLUGINS / "fatal_plugin.so")
+        self.assertEqual(done.returncode, 2, done.stderr)
+
+    def test_a_limit_for_a_diagnostic_that_was_not_selected_says_so(self):
+        done = self.run_limited("--limit", "Fake.Two:A > 0")
+        self.assertIn("no diagnostic was selected that has the name 'Fake.Two'", done.stdout)
 
     def test_what_is_not_a_limit_is_refused_before_anything_runs(self):
         record = self.directory / "record.jsonl"
@@ -142,7 +158,7 @@ class LimitsTest(CommandLineTest):
         # What is given for the analysis itself must fit, and so must a limit that fitted nothing in the run.
         limit = f"{back}:*.Total > 0"
         self.assertEqual(quazor("analyze", record, "--limit", limit).returncode, 2)
-        quazor("run", front, "--limit", "Nowhere:A > 0", "--record", record, "--replace")
+        quazor("run", front, "--limit", "TesselFaultDiagnostic:A > 0", "--record", record, "--replace")
         self.assertEqual(quazor("analyze", record).returncode, 2)
 
     def test_an_entry_that_was_removed_is_missed(self):

@@ -1,8 +1,10 @@
 #include "host/command/selection.h"
 
 #include "base/text/nearest_name.h"
+#include "contract/message_format.h"
 #include "host/command/explanations.h"
 #include "host/command/unknown_name.h"
+#include "host/model/limit_check.h"
 #include "host/plugin/plugin_loader.h"
 #include "host/plugin/plugin_trust.h"
 #include "host/plugin/profile.h"
@@ -68,6 +70,18 @@ void addChosenProfile(const std::filesystem::path& name, const Installation& ins
                       std::vector<Profile>& profiles) {
   const std::filesystem::path file = installation.profile(name);
   addProfile(file, file == name, installation, profiles);
+}
+
+// Refuses a limit of the command line for a diagnostic that does not exist, before anything runs.
+void refuseLimitsOfUnknown(const std::vector<UserLimit>& limits, const std::vector<Diagnostic>& catalogue) {
+  for (const UserLimit& limit : limits) {
+    const bool isKnown = std::any_of(catalogue.begin(), catalogue.end(),
+                                     [&limit](const Diagnostic& one) { return appliesTo(limit, one.name); });
+    if (isKnown) continue;
+    throw CommandError(ExitCode::kUsage,
+                       formatMessage("--limit '%@': no diagnostic has the name '%@'%@", canonicalText(limit),
+                                     limit.diagnostic, didYouMeanOrPattern(limit.diagnostic, namesOf(catalogue))));
+  }
 }
 
 std::vector<Profile> profilesOf(const Options& options, const Installation& installation) {
@@ -193,6 +207,8 @@ Selection select(const Options& options, const Installation& installation, Watch
   for (const DescribedDiagnostic& one : described) catalogue.push_back(one.diagnostic);
 
   const std::vector<Diagnostic> wanted = wantedWithWayOut(catalogue, options, installation, !scan.failed.empty());
+  // A plug-in that could not be loaded may have the diagnostic.
+  if (scan.failed.empty()) refuseLimitsOfUnknown(options.limits, allOf(catalogue, Wanted::kDiagnostics));
   std::vector<Profile> profiles = profilesOf(options, installation);
   describeForProfiles(options, installation, profiles, described, signals);
   addExplainedRanges(installation.explanations(), described);

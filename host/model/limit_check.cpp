@@ -84,10 +84,14 @@ LimitCheck compared(const UserLimit& limit, std::size_t index, const std::vector
   const QZMeasuredResult& result = results[index].result;
   LimitCheck check{limit, result, index};
   const std::string why = std::visit(Comparison(check, results), limit.condition);
-  if (!why.empty()) {
-    check.problem = formatMessage("the result %@ cannot be compared with the limit '%@': %@", result.name(),
-                                  canonicalText(limit), why);
-  }
+  if (why.empty()) return check;
+  check.skipped = results[index].verdict == ResultVerdict::kError;
+  check.problem =
+      check.skipped
+          ? formatMessage("the result %@ was not compared with the limit '%@': it cannot be judged by its own limit",
+                          result.name(), canonicalText(limit))
+          : formatMessage("the result %@ cannot be compared with the limit '%@': %@", result.name(),
+                          canonicalText(limit), why);
   return check;
 }
 
@@ -100,6 +104,7 @@ bool fitsAny(const UserLimit& limit, const DiagnosticRecord& record) {
 
 std::string_view LimitCheck::verdictName() const {
   if (passed) return nameOf(ResultVerdict::kPass);
+  if (skipped) return nameOf(Verdict::kSkip);
   return counts() && !problem.empty() ? nameOf(ResultVerdict::kError) : nameOf(limit.severity);
 }
 
@@ -255,7 +260,7 @@ DiagnosticErrorPtr errorOfLimitWithoutResult(const UserLimit& limit, const std::
   const bool isMeant = std::any_of(diagnostics.begin(), diagnostics.end(),
                                    [&limit](const std::string& name) { return appliesTo(limit, name); });
   std::string why = isMeant ? "no result has the name '" + limit.result + "'" + didYouMeanResult(limit.result, names)
-                            : "no diagnostic of this run has the name '" + limit.diagnostic + "'" +
+                            : "no diagnostic was selected that has the name '" + limit.diagnostic + "'" +
                                   didYouMean(limit.diagnostic, diagnostics);
   return hostError(
       HostErrorCode::kLimitWithoutResult,

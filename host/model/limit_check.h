@@ -21,11 +21,14 @@ struct LimitCheck {
   QZMeasuredResult result;
   std::size_t index = 0;  // of the result, among those of the record
   bool passed = false;
-  std::string problem{};  // why they cannot be compared; empty if they can
+  std::string problem{};  // why they were not compared; empty if they were
+  bool skipped = false;   // not compared because the result is an error by its own limit, which counts once
 
   // False if a failure only causes a warning.
   bool counts() const { return limit.severity == LimitSeverity::kFail; }
-  // "pass", "fail", "error" if they cannot be compared, or "warn".
+  // True if it causes a warning.
+  bool warns() const { return !passed && !skipped && !counts(); }
+  // "pass", "fail", "error" if they cannot be compared, "warn", or "skip".
   std::string_view verdictName() const;
 };
 

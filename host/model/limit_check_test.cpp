@@ -284,8 +284,8 @@ TEST(LimitWithoutResult, HasAnErrorThatNamesWhatIsNear) {
             "the limit 'BackTele.Totl > 0' (command line) was compared with nothing: no result has the name "
             "'BackTele.Totl'; did you mean 'BackTele.Total'?");
   EXPECT_EQ(errorOfLimitWithoutResult(limitFrom("Cameras.Bakc:A > 0"), records)->localizedDescription(),
-            "the limit 'Cameras.Bakc:A > 0' (command line) was compared with nothing: no diagnostic of this run has "
-            "the name 'Cameras.Bakc'; did you mean 'Cameras.Back'?");
+            "the limit 'Cameras.Bakc:A > 0' (command line) was compared with nothing: no diagnostic was selected "
+            "that has the name 'Cameras.Bakc'; did you mean 'Cameras.Back'?");
 }
 
 }  // namespace

@@ -92,8 +92,8 @@ void appendLine(std::string& csv, const std::vector<std::string_view>& fields) {
 }
 
 const std::vector<std::string_view> kDiagnosticColumns = {
-    "diagnostic", "verdict",   "result",        "value",      "unit",        "limit",     "lower",       "lowerOpen",
-    "upper",      "upperOpen", "resultVerdict", "errorStage", "errorDomain", "errorCode", "errorMessage"};
+    "diagnostic", "verdict",   "result",   "value",         "unit",       "limit",       "lower",     "lowerOpen",
+    "upper",      "upperOpen", "severity", "resultVerdict", "errorStage", "errorDomain", "errorCode", "errorMessage"};
 
 // Appends the name of the limit and the four cells of its bounds.
 void addLimit(std::vector<std::string>& cells, const std::optional<QZLimit>& limit) {
@@ -138,18 +138,20 @@ void appendDiagnosticLine(std::string& csv, const DiagnosticRecord& record, cons
 }
 
 std::vector<std::string> cellsOf(const QZMeasuredResult& result, const std::optional<QZLimit>& limit,
-                                 std::string_view verdict) {
+                                 std::string_view severity, std::string_view verdict) {
   const Measurement& measurement = result.measurement();
   std::vector<std::string> cells = {textCell(result.name()), defaultText(measurement.value()),
                                     textCell(measurement.unit().symbol())};
   addLimit(cells, limit);
+  cells.emplace_back(severity);
   cells.emplace_back(verdict);
   return cells;
 }
 
 // A user-defined limit. A relation has no bounds.
 std::vector<std::string> cellsOf(const LimitCheck& check) {
-  return cellsOf(check.result, boundsOf(check).value_or(QZLimit(labelOf(check.limit))), check.verdictName());
+  return cellsOf(check.result, boundsOf(check).value_or(QZLimit(labelOf(check.limit))), nameOf(check.limit.severity),
+                 check.verdictName());
 }
 
 }  // namespace
@@ -218,7 +220,7 @@ std::string diagnosticCsv(const std::vector<DiagnosticRecord>& records, std::vec
     const std::vector<LimitCheck> checks = limitChecksOf(record);
     for (std::size_t i = 0; i < record.measuredResults.size(); ++i) {
       const auto& [result, verdict, ignored] = record.measuredResults[i];
-      append(cellsOf(result, result.limit(), nameOf(verdict)));
+      append(cellsOf(result, result.limit(), {}, nameOf(verdict)));
       for (const LimitCheck& check : checksOfResult(checks, i)) append(cellsOf(check));
     }
     if (record.measuredResults.empty()) append({});

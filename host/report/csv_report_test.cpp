@@ -77,7 +77,7 @@ TEST(Csv, KeepsTextsFromBeingTakenForFormulas) {
     diagnostic.measuredResults.push_back(judgeResult(result));
     const std::string csv = diagnosticCsv({diagnostic});
     EXPECT_EQ(csv.substr(csv.find('\n') + 1), std::string(cell) + ",error," + cell + ",-2," + cell + ',' + cell +
-                                                  ",,,,,none,analyze," + cell + ",-7," + cell + '\n')
+                                                  ",,,,,,none,analyze," + cell + ",-7," + cell + '\n')
         << text;
   }
 }
@@ -131,7 +131,7 @@ TEST(ExperimentCsv, IsAHeaderAloneWhenNothingWasMeasured) {
 }
 
 constexpr const char* kDiagnosticHeader =
-    "diagnostic,verdict,result,value,unit,limit,lower,lowerOpen,upper,upperOpen,resultVerdict,"
+    "diagnostic,verdict,result,value,unit,limit,lower,lowerOpen,upper,upperOpen,severity,resultVerdict,"
     "errorStage,errorDomain,errorCode,errorMessage\n";
 
 TEST(DiagnosticCsv, HasALineForEachResult) {
@@ -144,25 +144,26 @@ TEST(DiagnosticCsv, HasALineForEachResult) {
   record.measuredResults.push_back({both, ResultVerdict::kPass});
   EXPECT_EQ(diagnosticCsv({record, recordOf("D2", Verdict::kPass)}),
             std::string(kDiagnosticHeader) +
-                "\"D, 1\",fail,Count,89,frames,Enough,90,0,,,fail,,,,\n"
-                "\"D, 1\",fail,Offset,0.5,events,,,,,,none,,,,\n"
-                "\"D, 1\",fail,Both,nan,errors,\"A \"\"range\"\"\",0.5,1,2,0,pass,,,,\n"
-                "D2,pass,Count,90,frames,Enough,90,0,,,pass,,,,\n"
-                "D2,pass,Offset,0.5,events,,,,,,none,,,,\n");
+                "\"D, 1\",fail,Count,89,frames,Enough,90,0,,,,fail,,,,\n"
+                "\"D, 1\",fail,Offset,0.5,events,,,,,,,none,,,,\n"
+                "\"D, 1\",fail,Both,nan,errors,\"A \"\"range\"\"\",0.5,1,2,0,,pass,,,,\n"
+                "D2,pass,Count,90,frames,Enough,90,0,,,,pass,,,,\n"
+                "D2,pass,Offset,0.5,events,,,,,,,none,,,,\n");
 }
 
 TEST(DiagnosticCsv, HasTheErrorOnEachLine) {
   DiagnosticRecord record = recordOf("D", Verdict::kError);
   record.errorStage = Stage::kTeardown;
   EXPECT_EQ(diagnosticCsv({record}), std::string(kDiagnosticHeader) +
-                                         "D,error,Count,90,frames,Enough,90,0,,,pass,teardown,Domain,-1,it failed\n"
-                                         "D,error,Offset,0.5,events,,,,,,none,teardown,Domain,-1,it failed\n");
+                                         "D,error,Count,90,frames,Enough,90,0,,,,pass,teardown,Domain,-1,it failed\n"
+                                         "D,error,Offset,0.5,events,,,,,,,none,teardown,Domain,-1,it failed\n");
 }
 
 TEST(DiagnosticCsv, HasALineForADiagnosticWithoutResults) {
   DiagnosticRecord record = recordOf("D", Verdict::kError);
   record.measuredResults.clear();
-  EXPECT_EQ(diagnosticCsv({record}), std::string(kDiagnosticHeader) + "D,error,,,,,,,,,,analyze,Domain,-1,it failed\n");
+  EXPECT_EQ(diagnosticCsv({record}),
+            std::string(kDiagnosticHeader) + "D,error,,,,,,,,,,,analyze,Domain,-1,it failed\n");
   EXPECT_EQ(diagnosticCsv({}), kDiagnosticHeader);
 }
 

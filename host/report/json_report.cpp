@@ -1,6 +1,5 @@
 #include "host/report/json_report.h"
 
-#include "host/model/limit_check.h"
 #include "host/plugin/parameter_range.h"
 #include "host/record/value_json.h"
 
@@ -26,13 +25,6 @@ Json runDocumentOf(const char* key, Json records, const std::optional<std::strin
 Json boundJson(const std::shared_ptr<const QZBound>& bound) {
   if (bound == nullptr) return {};
   return {{"value", numberJson(bound->value().value())}, {"open", bound->open()}};
-}
-
-Json checkJson(const LimitCheck& check) {
-  Json json = userLimitJson(check.limit);
-  json["verdict"] = check.verdictName();
-  if (!check.problem.empty()) json["problem"] = check.problem;
-  return json;
 }
 
 Json resultsJson(const DiagnosticRecord& record) {
@@ -128,6 +120,13 @@ Json userLimitJson(const UserLimit& limit) {
           {"name", limit.name},
           {"severity", nameOf(limit.severity)},
           {"source", limit.source}};
+}
+
+Json checkJson(const LimitCheck& check) {
+  Json json = userLimitJson(check.limit);
+  json["verdict"] = check.verdictName();
+  if (!check.problem.empty()) json["problem"] = check.problem;
+  return json;
 }
 
 Json limitJson(const std::optional<QZLimit>& limit) {

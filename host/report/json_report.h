@@ -2,6 +2,7 @@
 #pragma once
 
 #include "host/model/diagnostic_record.h"
+#include "host/model/limit_check.h"
 #include "host/plugin/diagnostic_registry.h"
 #include "host/plugin/parameters.h"
 
@@ -17,6 +18,8 @@ namespace quazor {
 nlohmann::ordered_json limitJson(const std::optional<QZLimit>& limit);
 // A limit of the user, with its origin.
 nlohmann::ordered_json userLimitJson(const UserLimit& limit);
+// The same with the verdict and, if the result could not be compared, the problem.
+nlohmann::ordered_json checkJson(const LimitCheck& check);
 
 nlohmann::ordered_json recordJson(const DiagnosticRecord& record);
 

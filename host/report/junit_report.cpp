@@ -64,7 +64,8 @@ void addResult(JUnitSuite& suite, const JudgedResult& judged) {
       formatMessage("%@ is %@, limit %@", result.name(), valueText(result.measurement()), limitText(result.limit())));
 }
 
-// A failed limit that only warns is a passed case with the verdict "warn".
+// A failed limit that only warns is a passed case with the verdict "warn". One on a result that is an error by its own
+// limit is skipped: the error has a case already.
 void addCheck(JUnitSuite& suite, const LimitCheck& check) {
   const Measurement& measurement = check.result.measurement();
   const std::string name = check.result.name() + ": " + labelOf(check.limit);
@@ -73,12 +74,14 @@ void addCheck(JUnitSuite& suite, const LimitCheck& check) {
   properties.add("value", defaultText(measurement.value()));
   properties.add("unit", measurement.unit().symbol());
   properties.add("limit", labelOf(check.limit));
+  properties.add("severity", std::string(nameOf(check.limit.severity)));
   if (const std::optional<QZLimit> bounds = boundsOf(check)) {
     addBound(properties, "lower", bounds->lowerBound());
     addBound(properties, "upper", bounds->upperBound());
   }
   if (!check.problem.empty()) properties.add("problem", check.problem);
-  if (check.passed || !check.counts()) return suite.addPass(name, properties);
+  if (check.skipped) return suite.addSkipped(name, properties, check.problem);
+  if (check.passed || check.warns()) return suite.addPass(name, properties);
   if (!check.problem.empty()) {
     return suite.addError(name, properties, hostError(HostErrorCode::kCannotBeJudged, check.problem));
   }
@@ -131,9 +134,10 @@ JUnitSuite suiteOfSuperseded(const RunStarted& run, const DiagnosticRecord& reco
   addParameters(suite.properties(), "experiment", record.parameters.experiment);
   addParameters(suite.properties(), "analysis", record.parameters.analysis);
   addRun(suite.properties(), run);
-  suite.addSkipped("superseded", formatMessage("%@ ended in an error, which was accepted because a later attempt had "
-                                               "none:\n%@",
-                                               trialText(record), errorText(record.error, "")));
+  suite.addSkipped("superseded", {},
+                   formatMessage("%@ ended in an error, which was accepted because a later attempt had "
+                                 "none:\n%@",
+                                 trialText(record), errorText(record.error, "")));
   suite.addLog(record.log);
   return suite;
 }
@@ -158,7 +162,7 @@ JUnitSuite suiteOf(const RunStarted& run, const DiagnosticRecord& record) {
   if (record.error != nullptr && !isOfResult(*record.error)) {
     suite.addError(std::string(errorStageText(record)), {}, record.error);
   }
-  if (record.skip) suite.addSkipped(std::string(nameOf(record.skip->kind)), record.skip->reason);
+  if (record.skip) suite.addSkipped(std::string(nameOf(record.skip->kind)), {}, record.skip->reason);
   suite.addLog(record.log);
   return suite;
 }
@@ -207,7 +211,7 @@ std::string junitReport(const RunStarted& run, const std::vector<DiagnosticRecor
   for (const PlannedDiagnostic& one : unrecorded.neverRun) {
     JUnitSuite suite = suiteOfUnrecorded(run, one.name, end);
     if (one.repetition > 0) suite.properties().add("repetition", std::to_string(one.repetition));
-    suite.addSkipped("never-run", "The run ended before this was started.");
+    suite.addSkipped("never-run", {}, "The run ended before this was started.");
     add(suite);
   }
   return "<?xml version=\"1.0\" encoding=\"UTF-8\"?>\n" + junitTag("testsuites", "quazor", counts, run.date) + suites +

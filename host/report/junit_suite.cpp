@@ -80,9 +80,9 @@ void JUnitSuite::addError(const std::string& name, const JUnitProperties& proper
               xmlText(errorText(error, "")) + "</error>");
 }
 
-void JUnitSuite::addSkipped(const std::string& name, const std::string& message) {
+void JUnitSuite::addSkipped(const std::string& name, const JUnitProperties& properties, const std::string& message) {
   ++counts_.skipped;
-  addCase(name, {}, "<skipped" + attribute("message", message) + "/>");
+  addCase(name, properties, "<skipped" + attribute("message", message) + "/>");
 }
 
 void JUnitSuite::addLog(const std::vector<LogLine>& lines) {

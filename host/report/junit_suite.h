@@ -50,7 +50,7 @@ class JUnitSuite {
   void addFailure(const std::string& name, const JUnitProperties& properties, const std::string& message);
   // Includes the underlying errors, one per line.
   void addError(const std::string& name, const JUnitProperties& properties, const DiagnosticErrorPtr& error);
-  void addSkipped(const std::string& name, const std::string& message);
+  void addSkipped(const std::string& name, const JUnitProperties& properties, const std::string& message);
   void addLog(const std::vector<LogLine>& lines);
 
   const JUnitCounts& counts() const { return counts_; }

@@ -39,7 +39,7 @@ TEST(JUnitSuite, HoldsTestCasesOfEveryKind) {
   suite.addPass("good", properties);
   suite.addFailure("bad", properties, "too few");
   suite.addError("broken", {}, errorWithMessage("D", -1, "it\nbroke", errorWithMessage("C", 2, "<deep>", nullptr)));
-  suite.addSkipped("never", "not run");
+  suite.addSkipped("never", {}, "not run");
   suite.addLog({{0ns, LogLevel::kError, "a\n]]>", kBegin + 1s}, {0ns, LogLevel::kDebug, "", kBegin + 2s}});
   EXPECT_EQ(
       suite.xml(),

@@ -78,9 +78,9 @@ TEST(LimitsInReports, AreInTheJsonOfTheResult) {
 
 TEST(LimitsInReports, HaveLinesInTheCsv) {
   const std::string csv = reportOf(Format::kCsv, limitedRecord());
-  EXPECT_THAT(csv, HasSubstr("\nGood,fail,Count,90,frames,many: Count >= 80 (command line),80,0,,,pass,"));
-  EXPECT_THAT(csv, HasSubstr("\nGood,fail,Count,90,frames,Count == 80 +- 2 (command line),78,0,82,0,fail,"));
-  EXPECT_THAT(csv, HasSubstr("\nGood,fail,Count,90,frames,Count < Offset (command line),,,,,warn,"));
+  EXPECT_THAT(csv, HasSubstr("\nGood,fail,Count,90,frames,many: Count >= 80 (command line),80,0,,,fail,pass,"));
+  EXPECT_THAT(csv, HasSubstr("\nGood,fail,Count,90,frames,Count == 80 +- 2 (command line),78,0,82,0,fail,fail,"));
+  EXPECT_THAT(csv, HasSubstr("\nGood,fail,Count,90,frames,Count < Offset (command line),,,,,warn,warn,"));
 }
 
 TEST(LimitsInReports, AreTestCasesOfJUnit) {
@@ -124,6 +124,50 @@ TEST(LimitsInReports, AreErrorsWhereTheyCannotBeCompared) {
   const std::string ocp = reportOf(Format::kOcp, record);
   EXPECT_THAT(lineWith(ocp, "Count-limit-unknown"), HasSubstr(R"("type":"UNKNOWN")"));
   EXPECT_THAT(ocp, Not(HasSubstr("Count > Offset (command line)\",\"type\"")));
+}
+
+TEST(LimitsInReports, HaveTheirSeverityWhenTheyPass) {
+  DiagnosticRecord record = limitedRecord();
+  record.limits = {limitFrom("Count >= 80", LimitSeverity::kFail), limitFrom("Count <= 99", LimitSeverity::kWarn)};
+  record.verdict = judgeRecord(record, true).verdict;
+  RunStarted run;
+  const std::string text = reportText(Format::kText, run, {record}, std::nullopt, {.verbose = true});
+  EXPECT_THAT(lineWith(text, "Result "), testing::EndsWith("Severity  Verdict"));
+  EXPECT_THAT(lineWith(text, "Count >= 80"), testing::EndsWith("  fail      pass"));
+  EXPECT_THAT(lineWith(text, "Count <= 99"), testing::EndsWith("  warn      pass"));
+  EXPECT_THAT(lineWith(text, "Offset"), testing::EndsWith("  -         -"));
+  const std::string csv = reportOf(Format::kCsv, record);
+  EXPECT_THAT(csv, HasSubstr("Count <= 99 (command line),,,99,0,warn,pass,"));
+  EXPECT_THAT(reportOf(Format::kJunit, record), HasSubstr("<property name=\"severity\" value=\"warn\"/>"));
+  EXPECT_THAT(
+      lineWith(reportOf(Format::kOcp, record), "\"measurement\":{\"name\":\"Count\""),
+      HasSubstr(R"({"limit":"Count <= 99","name":"","severity":"warn","source":"command line","verdict":"pass"})"));
+}
+
+TEST(LimitsInReports, AreSkippedOnAResultThatIsAnErrorByItsOwn) {
+  DiagnosticRecord record = limitedRecord();
+  record.limits = {limitFrom("Count >= 80", LimitSeverity::kFail), limitFrom("Count <= 99", LimitSeverity::kWarn)};
+  QZMeasuredResult broken("Count",
+                          Measurement(std::numeric_limits<double>::quiet_NaN(), QZDimensionlessUnit::frames()));
+  broken.setLimit(*record.measuredResults[0].result.limit());
+  record.measuredResults[0] = judgeResult(broken);
+  const RecordJudgement judged = judgeRecord(record, true);
+  record.verdict = judged.verdict;
+  record.error = judged.error;
+  EXPECT_EQ(record.verdict, Verdict::kError);
+  const std::string xml = reportOf(Format::kJunit, record);
+  EXPECT_THAT(lineWith(xml, "<testsuite "), HasSubstr("errors=\"1\" skipped=\"2\""));
+  EXPECT_THAT(lineWith(xml, "<skipped "),
+              HasSubstr("the result Count was not compared with the limit 'Count &gt;= 80': "
+                        "it cannot be judged by its own limit"));
+  const std::string csv = reportOf(Format::kCsv, record);
+  EXPECT_THAT(csv, HasSubstr("Count >= 80 (command line),80,0,,,fail,skip,"));
+  EXPECT_THAT(csv, HasSubstr("Count <= 99 (command line),,,99,0,warn,skip,"));
+  EXPECT_THAT(reportOf(Format::kJson, record), HasSubstr("\"verdict\": \"skip\""));
+  const std::string ocp = reportOf(Format::kOcp, record);
+  EXPECT_THAT(lineWith(ocp, "Count-limit-unknown"), HasSubstr(R"("type":"UNKNOWN")"));
+  EXPECT_THAT(ocp, Not(HasSubstr("\"WARNING\"")));
+  EXPECT_THAT(reportOf(Format::kText, record), Not(HasSubstr("warning")));
 }
 
 TEST(LimitsInReports, AreComparedByDiff) {

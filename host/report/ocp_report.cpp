@@ -6,6 +6,7 @@
 #include "host/model/limit_check.h"
 #include "host/model/trials.h"
 #include "host/record/value_json.h"
+#include "host/report/json_report.h"
 #include "host/report/ocp_stream.h"
 #include "host/report/run_identity.h"
 #include "host/report/text_report.h"
@@ -296,15 +297,17 @@ class OcpRecordWriter {
 
   void writeResult(const JudgedResult& one, const std::vector<LimitCheck>& checks, bool known) {
     Json measurement = resultJson(one);
-    for (const LimitCheck& check : checks) addValidators(measurement, check);
+    for (const LimitCheck& check : checks) {
+      addValidators(measurement, check);
+      measurement["metadata"]["userLimits"].push_back(checkJson(check));
+    }
     stream_.addToStep(kAnalysisStep, "measurement", std::move(measurement), stepEnd_);
     if (one.verdict != ResultVerdict::kNone) {
       stream_.addToStep(kAnalysisStep, "diagnosis", diagnosisJson(one, known), stepEnd_);
     }
     for (const LimitCheck& check : checks) {
-      const bool warns = !check.passed && !check.counts();
       Json diagnosis = diagnosisJson(check, known);
-      if (warns) {  // a diagnosis FAIL would make the run fail
+      if (check.warns()) {  // a diagnosis FAIL would make the run fail
         stream_.addToStep(kAnalysisStep, "log", {{"severity", "WARNING"}, {"message", diagnosis["message"]}}, stepEnd_);
       } else {
         stream_.addToStep(kAnalysisStep, "diagnosis", std::move(diagnosis), stepEnd_);

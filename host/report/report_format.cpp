@@ -120,7 +120,9 @@ std::string reportText(Format format, const RunStarted& run, const std::vector<D
     case Format::kText: return textReport(run, records, interrupted, text);
     case Format::kCsv: {
       std::vector<std::uint64_t> seeds;
-      const std::string csv = run.ofExperiments ? experimentCsv(records, &seeds) : diagnosticCsv(records, &seeds);
+      const std::string csv = run.ofExperiments
+                                  ? experimentCsv(records, &seeds)
+                                  : diagnosticCsv(withInterruptedOfAnalysis(run, records, interrupted), &seeds);
       return withRunColumns(csv, run, seeds);
     }
     case Format::kOcp: return ocpReport(run, records, interrupted);
@@ -152,11 +154,13 @@ void printReport(std::ostream& out, const RunStarted& run, const DiagnosticRecor
   }
 }
 
-void printEnd(std::ostream& out, const RunStarted& run, const std::vector<DiagnosticRecord>& records,
+void printEnd(std::ostream& out, const RunStarted& run, const std::vector<DiagnosticRecord>& finished,
               const std::optional<std::string>& interrupted, const TextContent& text, bool colour) {
   const bool endsWithRepetition =
-      !records.empty() && !text.verbose && !run.ofExperiments && records.back().trial.repetition > 0;
+      !finished.empty() && !text.verbose && !run.ofExperiments && finished.back().trial.repetition > 0;
   if (endsWithRepetition) out << '\n';
+  const std::vector<DiagnosticRecord> records = withInterruptedOfAnalysis(run, finished, interrupted);
+  if (records.size() > finished.size()) printReport(out, run, records.back(), {colour, false, text.verbose});
   printVariation(out, records);
   if (records.size() != 1 || interrupted) {
     const std::size_t notReached = interrupted ? unrecordedDiagnosticsOf(run, records, interrupted).neverRun.size() : 0;

@@ -137,5 +137,19 @@ TEST_F(ReportTextTest, CountsOneRecordOnlyWhenTheRunWasInterrupted) {
   EXPECT_EQ(nlohmann::json::parse(report(Format::kJson, "B"))["interrupted"], "B");
 }
 
+TEST_F(ReportTextTest, HasWhatWasInterruptedInTheRecordOfAnAnalysis) {
+  records_.pop_back();
+  run_.analyzed.emplace();
+  const std::string text = report(Format::kText, "B");
+  EXPECT_THAT(text, testing::AllOf(HasSubstr("\nERROR B\n  The recorded run stopped while this was running.\n\n  "
+                                             "QuazorHostErrorDomain code 11: B was interrupted\n"),
+                                   HasSubstr("2 diagnostics: 1 passed, 0 failed, 1 ended in an error\n"),
+                                   HasSubstr("\nERROR B: QuazorHostErrorDomain code 11\n")));
+  EXPECT_THAT(report(Format::kCsv, "B"), HasSubstr("\nB,error,,,,,,,,,,,QuazorHostErrorDomain,11,B was interrupted,"));
+  for (const Format format : {Format::kText, Format::kCsv}) {
+    EXPECT_THAT(report(format, ""), testing::Not(HasSubstr("code 11"))) << nameOf(format);
+  }
+}
+
 }  // namespace
 }  // namespace quazor

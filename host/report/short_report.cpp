@@ -135,9 +135,8 @@ std::string resultCountsText(const DiagnosticRecord& record) {
   addCount(text, limited, "with a limit", "with limits");
   addCount(text, countOf(ResultVerdict::kFail), "failed", "failed");
   addCount(text, countOf(ResultVerdict::kError), "not judged", "not judged");
-  const auto isWarning = [](const LimitCheck& check) { return !check.passed && !check.counts(); };
-  addCount(text, static_cast<std::size_t>(std::count_if(checks.begin(), checks.end(), isWarning)), "warning",
-           "warnings");
+  const auto warnings = std::count_if(checks.begin(), checks.end(), [](const LimitCheck& one) { return one.warns(); });
+  addCount(text, static_cast<std::size_t>(warnings), "warning", "warnings");
   return text;
 }
 

@@ -63,21 +63,59 @@ std::string_view colourOfRow(std::string_view verdict) {
   return verdict == nameOf(ResultVerdict::kNone) ? std::string_view() : kYellow;
 }
 
-void addResultRow(Table& table, const QZMeasuredResult& result, const std::string& limit, std::string_view verdict,
-                  bool colour) {
-  const Measurement& measurement = result.measurement();
-  const std::string_view before = colour ? colourOfRow(verdict) : std::string_view();
-  table.addRow({printable(result.name()), defaultText(measurement.value()), printable(measurement.unit().symbol()),
-                limit, verdict == nameOf(ResultVerdict::kNone) ? "-" : std::string(verdict)},
-               std::string(before), std::string(before.empty() ? std::string_view() : kPlain));
-}
+// The results of a record and the limits of the user, of which some only warn.
+// Thread: one at a time.
+class ResultTable {
+ public:
+  ResultTable(bool showsSeverity, bool colour)
+      : showsSeverity_(showsSeverity), colour_(colour), table_(alignments(showsSeverity)) {
+    std::vector<std::string> header{"Result", "Value", "Unit", "Limit", "Verdict"};
+    if (showsSeverity_) header.insert(header.end() - 1, "Severity");
+    table_.addHeader(std::move(header));
+  }
+
+  void add(const JudgedResult& one) { addRow(one.result, limitText(one.result.limit()), "-", nameOf(one.verdict)); }
+
+  void add(const LimitCheck& check) {
+    addRow(check.result, printable(labelOf(check.limit)), nameOf(check.limit.severity), check.verdictName());
+  }
+
+  // Prints nothing if there is no row.
+  void print(std::ostream& out) const {
+    if (!isEmpty_) table_.print(out, "  ");
+  }
+
+ private:
+  static std::vector<Table::Align> alignments(bool showsSeverity) {
+    std::vector<Table::Align> columns(showsSeverity ? 6 : 5, Table::Align::kLeft);
+    columns[1] = Table::Align::kRight;
+    return columns;
+  }
+
+  void addRow(const QZMeasuredResult& result, const std::string& limit, std::string_view severity,
+              std::string_view verdict) {
+    const Measurement& measurement = result.measurement();
+    std::vector<std::string> cells{printable(result.name()), defaultText(measurement.value()),
+                                   printable(measurement.unit().symbol()), limit,
+                                   verdict == nameOf(ResultVerdict::kNone) ? "-" : std::string(verdict)};
+    if (showsSeverity_) cells.insert(cells.end() - 1, std::string(severity));
+    const std::string_view before = colour_ ? colourOfRow(verdict) : std::string_view();
+    table_.addRow(std::move(cells), std::string(before), std::string(before.empty() ? std::string_view() : kPlain));
+    isEmpty_ = false;
+  }
+
+  const bool showsSeverity_;
+  const bool colour_;
+  Table table_;
+  bool isEmpty_ = true;
+};
 
 std::size_t warningsIn(const std::vector<DiagnosticRecord>& records) {
   std::size_t warnings = 0;
   for (const DiagnosticRecord& record : records) {
     const std::vector<LimitCheck> checks = limitChecksOf(record);
-    warnings += static_cast<std::size_t>(std::count_if(
-        checks.begin(), checks.end(), [](const LimitCheck& one) { return !one.passed && !one.counts(); }));
+    warnings += static_cast<std::size_t>(
+        std::count_if(checks.begin(), checks.end(), [](const LimitCheck& one) { return one.warns(); }));
   }
   return warnings;
 }
@@ -162,30 +200,23 @@ std::string errorText(const DiagnosticErrorPtr& error, std::string_view indent) 
 std::string_view errorStageText(const DiagnosticRecord& record) {
   if (record.error == nullptr) return {};
   if (record.errorStage) return nameOf(*record.errorStage);
-  const bool isOfRecord = record.error->domain() == QuazorHostErrorDomain &&
-                          record.error->code() == static_cast<std::int64_t>(HostErrorCode::kNotRecorded);
-  return isOfRecord ? "record" : nameOf(Stage::kAnalyze);
+  const auto isHostError = [&record](HostErrorCode code) {
+    return record.error->domain() == QuazorHostErrorDomain && record.error->code() == static_cast<std::int64_t>(code);
+  };
+  if (isHostError(HostErrorCode::kNotRecorded)) return "record";
+  return isHostError(HostErrorCode::kInterrupted) ? std::string_view() : nameOf(Stage::kAnalyze);
 }
 
 void printResults(std::ostream& out, const DiagnosticRecord& record, ResultRows rows, bool colour) {
-  using Align = Table::Align;
-  Table table({Align::kLeft, Align::kRight, Align::kLeft, Align::kLeft, Align::kLeft});
-  table.addHeader({"Result", "Value", "Unit", "Limit", "Verdict"});
   const std::vector<LimitCheck> checks = limitChecksOf(record);
-  bool empty = true;
+  ResultTable table(rows == ResultRows::kAll && !checks.empty(), colour);
   for (std::size_t i = 0; i < record.measuredResults.size(); ++i) {
     const JudgedResult& one = record.measuredResults[i];
     const bool isNoteworthy = one.verdict == ResultVerdict::kFail || one.verdict == ResultVerdict::kError;
-    if (rows == ResultRows::kAll || isNoteworthy) {
-      addResultRow(table, one.result, limitText(one.result.limit()), nameOf(one.verdict), colour);
-      empty = false;
-    }
-    for (const LimitCheck& check : checksOfResult(checks, i)) {
-      addResultRow(table, check.result, printable(labelOf(check.limit)), check.verdictName(), colour);
-      empty = false;
-    }
+    if (rows == ResultRows::kAll || isNoteworthy) table.add(one);
+    for (const LimitCheck& check : checksOfResult(checks, i)) table.add(check);
   }
-  if (!empty) table.print(out, "  ");
+  table.print(out);
 }
 
 std::string verdictText(const DiagnosticRecord& record, bool colour) {
