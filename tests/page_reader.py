@@ -82,12 +82,13 @@ def verdict_of(badge):
 
 
 def result_of(cells):
-    name, value, unit, limit, bar, verdict = cells
+    name, value, unit, limit, *severity, bar, verdict = cells
     found = verdict_of(verdict.first("span"))
     svg = bar.first("svg")
     if svg is not None and (svg.attributes["aria-label"] == "inside the limit") != (found == "pass"):
         raise ValueError(f"the bar of {name.text} contradicts the verdict {found}")
-    return Result(name.text, number(value.text), unit.text, text_limit(limit.text), found)
+    return Result(name.text, number(value.text), unit.text, text_limit(limit.text), found,
+                  "".join(one.text for one in severity).replace("\u2013", ""))
 
 
 def error_of(paragraph):
@@ -155,9 +156,9 @@ def expected(record):
         "errors": [Error(printable(one.domain), one.code, printable(one.message)) for one in record["errors"]],
         "results": [shown(one) for one in rows_of(record, lambda label, *_: Limit(label, None, None))],
         "measurements": [(printable(name), value, printable(unit)) for name, value, unit in record["measurements"]],
-        "parameters": [(half, printable(name), value) for half, values in record["parameters"].items()
+        "parameters": [(half, printable(name), value) for half, values in record.get("parameters", {}).items()
                        for name, value in values.items()],
-        "log": [(level, shown_lines(text)) for level, text in record["log"]],
+        "log": [(level, shown_lines(text)) for level, text in record.get("log", [])],
         "seed": record["seed"],
     })
 

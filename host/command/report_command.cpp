@@ -4,6 +4,7 @@
 #include "contract/message_format.h"
 #include "host/command/commands.h"
 #include "host/command/explanations.h"
+#include "host/model/incomplete_run.h"
 #include "host/record/record_file.h"
 #include "host/record/record_place.h"
 #include "host/report/page/page.h"
@@ -12,6 +13,7 @@
 
 #include <filesystem>
 #include <optional>
+#include <utility>
 #include <vector>
 
 namespace quazor {
@@ -62,9 +64,10 @@ void writePage(const Options& options, const Installation& installation, Console
   runs.reserve(files.size());
   std::vector<ShownRun> shown;
   for (const std::filesystem::path& file : files) {
-    runs.push_back(runIn(file));
-    shown.push_back(shownRun(runs.back(), file));
-    if (!runs.back().ended) tellThatTheRunDidNotEnd(file, "page", console);
+    RecordedRun& run = runs.emplace_back(runIn(file));
+    if (run.ended) run.records = withInterruptedOfAnalysis(run.began, std::move(run.records), run.ended->interrupted);
+    shown.push_back(shownRun(run, file));
+    if (!run.ended) tellThatTheRunDidNotEnd(file, "page", console);
   }
   PageOptions content = pageOptions(installation);
   content.frames = options.ofRecords.frames;

@@ -127,7 +127,10 @@ std::string reportText(Format format, const RunStarted& run, const std::vector<D
     }
     case Format::kOcp: return ocpReport(run, records, interrupted);
     case Format::kJunit: return junitReport(run, records, interrupted, {text.allowSkips, run.acceptFlaky});
-    case Format::kHtml: return text.page({run, records, streams, interrupted});
+    case Format::kHtml: {
+      const std::vector<DiagnosticRecord> all = withInterruptedOfAnalysis(run, records, interrupted);
+      return text.page({run, all, streams, interrupted});
+    }
     case Format::kJson: break;
   }
   nlohmann::ordered_json document =

@@ -23,10 +23,11 @@ struct Row {
   const QZMeasuredResult& result;
   std::string limit;  // as text
   std::optional<QZLimit> bounds;
+  std::string_view severity;  // of a limit of the user; empty for the plug-in's
   std::string_view verdict;
 };
 
-std::string rowOf(const Row& row) {
+std::string rowOf(const Row& row, bool showsSeverity) {
   const Measurement& measurement = row.result.measurement();
   const bool isOutside = row.verdict == "fail" || row.verdict == "warn";
   const bool isJudged = isOutside || row.verdict == "pass";
@@ -35,6 +36,7 @@ std::string rowOf(const Row& row) {
   cells += element("td class=\"number\"", htmlText(defaultText(measurement.value())));
   cells += element("td", htmlText(measurement.unit().symbol()));
   cells += element("td", htmlText(row.limit));
+  if (showsSeverity) cells += element("td", row.severity.empty() ? "\xE2\x80\x93" : row.severity);
   cells += element("td", isJudged ? limitBar(measurement.value(), row.bounds, !isOutside) : std::string());
   cells += element("td", verdictBadge(row.verdict) + (deviation.empty() ? "" : element("small", deviation)));
   return element(isOutside || row.verdict == "error" ? "tr class=\"bad\"" : "tr", cells) + "\n";
@@ -65,18 +67,23 @@ std::string verdictBadge(std::string_view verdict) {
 std::string resultsTable(const DiagnosticRecord& record) {
   if (record.measuredResults.empty()) return {};
   const std::vector<LimitCheck> checks = limitChecksOf(record);
+  const bool showsSeverity = !checks.empty();
   std::string rows;
   for (std::size_t i = 0; i < record.measuredResults.size(); ++i) {
     const JudgedResult& one = record.measuredResults[i];
-    rows += rowOf({one.result, limitText(one.result.limit()), one.result.limit(), nameOf(one.verdict)});
+    rows +=
+        rowOf({one.result, limitText(one.result.limit()), one.result.limit(), {}, nameOf(one.verdict)}, showsSeverity);
     for (const LimitCheck& check : checksOfResult(checks, i)) {
-      rows += rowOf({check.result, labelOf(check.limit), boundsOf(check), check.verdictName()});
+      rows += rowOf(
+          {check.result, labelOf(check.limit), boundsOf(check), nameOf(check.limit.severity), check.verdictName()},
+          showsSeverity);
     }
   }
   return "<table class=\"results\"><caption>Results and their limits</caption><thead><tr><th scope=\"col\">Result</th>"
-         "<th scope=\"col\">Value</th><th scope=\"col\">Unit</th><th scope=\"col\">Limit</th>"
-         "<th scope=\"col\">In the limit</th><th scope=\"col\">Verdict</th></tr></thead>\n<tbody>\n" +
-         rows + "</tbody></table>\n";
+         "<th scope=\"col\">Value</th><th scope=\"col\">Unit</th><th scope=\"col\">Limit</th>" +
+         (showsSeverity ? element("th scope=\"col\"", "Severity") : "") +
+         "<th scope=\"col\">In the limit</th><th scope=\"col\">Verdict</th></tr></thead>\n<tbody>\n" + rows +
+         "</tbody></table>\n";
 }
 
 std::vector<std::string> failureSentences(const DiagnosticRecord& record) {
@@ -90,7 +97,7 @@ std::vector<std::string> failureSentences(const DiagnosticRecord& record) {
       sentences.push_back(problemSentence(one.result, one.problem));
     }
     for (const LimitCheck& check : checksOfResult(checks, i)) {
-      if (check.passed || !check.counts()) continue;
+      if (check.passed || check.skipped || !check.counts()) continue;
       sentences.push_back(check.problem.empty() ? sentence(check.result, boundsOf(check), labelOf(check.limit))
                                                 : problemSentence(check.result, check.problem));
     }
