@@ -22,7 +22,7 @@ using testing::HasSubstr;
 using testing::StartsWith;
 
 TEST(Formats, HaveNamesByWhichTheyAreFound) {
-  constexpr std::string_view kNames[] = {"text", "json", "csv", "ocp", "junit"};
+  constexpr std::string_view kNames[] = {"text", "json", "csv", "ocp", "junit", "html"};
   for (std::size_t i = 0; i < std::size(kFormats); ++i) {
     EXPECT_EQ(nameOf(kFormats[i]), kNames[i]);
     EXPECT_EQ(formatNamed(kNames[i]), kFormats[i]);
@@ -145,7 +145,7 @@ TEST_F(ReportTextTest, HasWhatWasInterruptedInTheRecordOfAnAnalysis) {
                                              "QuazorHostErrorDomain code 11: B was interrupted\n"),
                                    HasSubstr("2 diagnostics: 1 passed, 0 failed, 1 ended in an error\n"),
                                    HasSubstr("\nERROR B: QuazorHostErrorDomain code 11\n")));
-  EXPECT_THAT(report(Format::kCsv, "B"), HasSubstr("\nB,error,,,,,,,,,,,QuazorHostErrorDomain,11,B was interrupted,"));
+  EXPECT_THAT(report(Format::kCsv, "B"), HasSubstr("\nB,error,,,,,,,,,,,,QuazorHostErrorDomain,11,B was interrupted,"));
   for (const Format format : {Format::kText, Format::kCsv}) {
     EXPECT_THAT(report(format, ""), testing::Not(HasSubstr("code 11"))) << nameOf(format);
   }
