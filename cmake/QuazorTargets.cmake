@@ -103,13 +103,11 @@ function(quazor_library name)
     target_compile_options(quazor_${name} PRIVATE -fsanitize=fuzzer-no-link)
   endif()
   file(RELATIVE_PATH folder ${PROJECT_SOURCE_DIR} ${CMAKE_CURRENT_SOURCE_DIR})
-  # The host and what reads or writes JSON wait for hardware and disks: optimising them fully takes a third of the
+  # The host, tests and what reads or writes JSON wait for hardware and disks: optimising them fully takes a third of the
   # build's time, and nobody feels it.
-  if(name MATCHES "^host_" OR "nlohmann_json::nlohmann_json" IN_LIST ARG_DEPENDS)
+  if(name MATCHES "^host_" OR folder MATCHES "^tests" OR "nlohmann_json::nlohmann_json" IN_LIST ARG_DEPENDS)
     quazor_precompile(quazor_${name} json ${QUAZOR_COMMON_HEADERS} <nlohmann/json.hpp>)
     target_compile_options(quazor_${name} PRIVATE $<$<CONFIG:Release>:-O1> $<$<CONFIG:Debug>:-O0>)
-  elseif(folder MATCHES "^tests")
-    quazor_precompile(quazor_${name} json ${QUAZOR_COMMON_HEADERS} <nlohmann/json.hpp>)
   else()
     quazor_precompile(quazor_${name} plain ${QUAZOR_COMMON_HEADERS})
   endif()
