@@ -145,7 +145,7 @@ TEST_F(ReportTextTest, HasWhatWasInterruptedInTheRecordOfAnAnalysis) {
                                              "QuazorHostErrorDomain code 11: B was interrupted\n"),
                                    HasSubstr("2 diagnostics: 1 passed, 0 failed, 1 ended in an error\n"),
                                    HasSubstr("\nERROR B: QuazorHostErrorDomain code 11\n")));
-  EXPECT_THAT(report(Format::kCsv, "B"), HasSubstr("\nB,error,,,,,,,,,,,QuazorHostErrorDomain,11,B was interrupted,"));
+  EXPECT_THAT(report(Format::kCsv, "B"), HasSubstr("\nB,error,,,,,,,,,,,,QuazorHostErrorDomain,11,B was interrupted,"));
   for (const Format format : {Format::kText, Format::kCsv}) {
     EXPECT_THAT(report(format, ""), testing::Not(HasSubstr("code 11"))) << nameOf(format);
   }
