@@ -21,6 +21,7 @@ import xml.etree.ElementTree
 
 import csv_reader
 import ocp_rules
+import page_reader
 import record_reader
 import report_limits
 import report_readers
@@ -29,7 +30,7 @@ from report_readers import blurred, in_xml
 COUNT = 1000
 SEED = 20261121
 SHOWN = 20
-FORMS = ("text", "json", "csv", "ocp", "junit", "record")
+FORMS = ("text", "json", "csv", "ocp", "junit", "html", "record")
 INTERRUPTION = report_readers.Error("QuazorHostErrorDomain", 11, "it was interrupted")
 SIGNS = ("]]>", "\ufffd", "\uffff", "\\u0000", "\\r", "\u2028", ",")  # as in JSON
 # The samples must contain some of each.
@@ -243,6 +244,8 @@ class Comparison:
         begin = [line.decode("utf-8", "replace") for line in lines.block()]
         self.check(f"{name} text: begin", blurred(begin), blurred(text_begin(run)))
         self.compare_text(name, lines, of_experiments, records, varies, end)
+        counts = counts_line(records, of_experiments, never_began)
+        page_reader.compare(self, name, reports["html"], run, of_experiments, records, due, interrupted, counts)
 
     @staticmethod
     def is_superseded(records, place):

@@ -53,9 +53,10 @@ std::string_view nameOf(Format format) {
     case Format::kJson: return "json";
     case Format::kCsv: return "csv";
     case Format::kOcp: return "ocp";
-    case Format::kJunit: break;
+    case Format::kJunit: return "junit";
+    case Format::kHtml: break;
   }
-  return "junit";
+  return "html";
 }
 
 std::optional<Format> formatNamed(std::string_view name) {
@@ -98,9 +99,9 @@ OutputRequest parseOutput(const std::string& text, Format usual) {
 }
 
 std::optional<Format> otherFormatOfSuffix(const OutputRequest& output) {
-  constexpr std::pair<std::string_view, Format> kSuffixes[] = {{".txt", Format::kText},  {".log", Format::kText},
-                                                               {".json", Format::kJson}, {".jsonl", Format::kOcp},
-                                                               {".csv", Format::kCsv},   {".xml", Format::kJunit}};
+  constexpr std::pair<std::string_view, Format> kSuffixes[] = {
+      {".txt", Format::kText}, {".log", Format::kText},  {".json", Format::kJson}, {".jsonl", Format::kOcp},
+      {".csv", Format::kCsv},  {".xml", Format::kJunit}, {".html", Format::kHtml}, {".htm", Format::kHtml}};
   std::string suffix = output.file.extension().string();
   std::transform(suffix.begin(), suffix.end(), suffix.begin(),
                  [](char unit) { return unit >= 'A' && unit <= 'Z' ? static_cast<char>(unit - 'A' + 'a') : unit; });
@@ -113,7 +114,8 @@ std::optional<Format> otherFormatOfSuffix(const OutputRequest& output) {
 }
 
 std::string reportText(Format format, const RunStarted& run, const std::vector<DiagnosticRecord>& records,
-                       const std::optional<std::string>& interrupted, const TextContent& text) {
+                       const std::optional<std::string>& interrupted, const TextContent& text,
+                       const RunStreams& streams) {
   switch (format) {
     case Format::kText: return textReport(run, records, interrupted, text);
     case Format::kCsv: {
@@ -125,6 +127,10 @@ std::string reportText(Format format, const RunStarted& run, const std::vector<D
     }
     case Format::kOcp: return ocpReport(run, records, interrupted);
     case Format::kJunit: return junitReport(run, records, interrupted, {text.allowSkips, run.acceptFlaky});
+    case Format::kHtml: {
+      const std::vector<DiagnosticRecord> all = withInterruptedOfAnalysis(run, records, interrupted);
+      return text.page({run, all, streams, interrupted});
+    }
     case Format::kJson: break;
   }
   nlohmann::ordered_json document =

@@ -22,7 +22,7 @@ using testing::HasSubstr;
 using testing::StartsWith;
 
 TEST(Formats, HaveNamesByWhichTheyAreFound) {
-  constexpr std::string_view kNames[] = {"text", "json", "csv", "ocp", "junit"};
+  constexpr std::string_view kNames[] = {"text", "json", "csv", "ocp", "junit", "html"};
   for (std::size_t i = 0; i < std::size(kFormats); ++i) {
     EXPECT_EQ(nameOf(kFormats[i]), kNames[i]);
     EXPECT_EQ(formatNamed(kNames[i]), kFormats[i]);

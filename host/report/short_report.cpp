@@ -105,7 +105,12 @@ std::string textOf(const FailureLine& line) {
   return line.first.empty() ? line.text : formatMessage("%@ (%@)", line.text, line.first);
 }
 
-// What to ask about a diagnostic that did not pass, the most specific first.
+void addCount(std::string& text, std::size_t number, std::string_view one, std::string_view several) {
+  if (number > 0) text += formatMessage(", %@ %@", number, number == 1 ? one : several);
+}
+
+}  // namespace
+
 std::vector<std::string> topicsOf(const DiagnosticRecord& record) {
   std::vector<std::string> topics;
   if (record.error != nullptr) {
@@ -116,12 +121,6 @@ std::vector<std::string> topicsOf(const DiagnosticRecord& record) {
   topics.push_back(record.name);
   return topics;
 }
-
-void addCount(std::string& text, std::size_t number, std::string_view one, std::string_view several) {
-  if (number > 0) text += formatMessage(", %@ %@", number, number == 1 ? one : several);
-}
-
-}  // namespace
 
 std::string resultCountsText(const DiagnosticRecord& record) {
   if (record.measuredResults.empty()) return {};
