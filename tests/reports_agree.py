@@ -55,6 +55,8 @@ def trial_text(record, run):
     if record["attempt"] and (record["attempt"] > 1 or record["verdict"] == "error"):
         passed = "pass in " if record["verdict"] == "pass" else ""
         parts.append(f"{passed}attempt {record['attempt']} of {run['attempts']}")
+    if record["repetition"] and record["verdict"] in ("fail", "error"):
+        parts.append(f"seed {record['seed']}")
     return ", ".join(parts)
 
 
@@ -403,7 +405,7 @@ class Comparison:
             got = report_readers.read_text(lines, expected)
             self.check_record(f"{name} {place} text", blurred(got), blurred(expected))
         if any(one["repetition"] for one in records):
-            title = b"What varied between the repetitions" + b" (#: the first repetition with that value; Outlier: the one that differs most, and its seed)" * varies + b":"
+            title = b"What varied between the repetitions" + b" (#: the first repetition with that value; Outlier: the one whose rare value differs most, and its seed)" * varies + b":"
             self.check(f"{name} text: variation", lines.block()[0], title)
         left = [line.decode("utf-8", "replace") for line in lines.rest()]
         self.check(f"{name} text: end", blurred(left), blurred([*end, ""]))

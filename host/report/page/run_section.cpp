@@ -31,7 +31,7 @@ std::string idOf(std::size_t run, std::size_t record) {
 }
 
 std::string titleOf(const DiagnosticRecord& record) {
-  const std::string trial = trialText(record);
+  const std::string trial = trialTextWithSeed(record);
   return htmlName(record.name) + (trial.empty() ? "" : " " + element("span class=\"soft\"", "(" + trial + ")")) + " " +
          verdictBadge(nameOf(record.verdict));
 }
@@ -133,7 +133,7 @@ std::string findings(const ShownRun& run, std::size_t number, int level, const P
 }
 
 std::string rowOf(const DiagnosticRecord& record, const std::string& id) {
-  const std::string trial = trialText(record);
+  const std::string trial = trialTextWithSeed(record);
   const std::string results = record.skip ? textOf(*record.skip) : resultCountsText(record);
   return element("tr", element("th scope=\"row\"", "<a href=\"#" + id + "\">" + htmlName(record.name) + "</a>" +
                                                        (trial.empty() ? "" : " (" + trial + ")")) +
