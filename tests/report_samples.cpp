@@ -8,6 +8,7 @@
 #include "host/error/host_error.h"
 #include "host/model/judge.h"
 #include "host/model/limit_check.h"
+#include "host/report/page/page.h"
 #include "host/report/report_format.h"
 #include "tests/sample_record.h"
 
@@ -429,13 +430,15 @@ bool writeSamples(const std::filesystem::path& directory, std::size_t count, std
   std::vector<std::ofstream> files;
   for (const Format format : kFormats) files.emplace_back(directory / nameOf(format), std::ios::binary);
   files.emplace_back(directory / "record", std::ios::binary);
+  TextContent text;
+  text.verbose = true;
+  text.page = [](const ShownRun& run) { return reportPage({run}, {}); };
   Generator generator(seed);
   for (std::size_t i = 0; i < count; ++i) {
     const auto [run, records, interrupted] = generator.sample();
     for (std::size_t at = 0; at < files.size(); ++at) {
-      const std::string report = at < std::size(kFormats)
-                                     ? reportText(kFormats[at], run, records, interrupted, {true, {}})
-                                     : recordOf(run, records, interrupted);
+      const std::string report = at < std::size(kFormats) ? reportText(kFormats[at], run, records, interrupted, text)
+                                                          : recordOf(run, records, interrupted);
       files[at] << report.size() << '\n' << report;
     }
   }

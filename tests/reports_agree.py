@@ -21,6 +21,7 @@ import xml.etree.ElementTree
 
 import csv_reader
 import ocp_rules
+import page_reader
 import record_reader
 import report_limits
 import report_readers
@@ -29,7 +30,7 @@ from report_readers import blurred, in_xml
 COUNT = 1000
 SEED = 20261121
 SHOWN = 20
-FORMS = ("text", "json", "csv", "ocp", "junit", "record")
+FORMS = ("text", "json", "csv", "ocp", "junit", "html", "record")
 INTERRUPTION = report_readers.Error("QuazorHostErrorDomain", 11, "it was interrupted")
 LIMIT_WITHOUT_RESULT = ("QuazorHostErrorDomain", 14)
 SIGNS = ("]]>", "\ufffd", "\uffff", "\\u0000", "\\r", "\u2028", ",")  # as in JSON
@@ -56,6 +57,8 @@ def trial_text(record, run):
     if record["attempt"] and (record["attempt"] > 1 or record["verdict"] == "error"):
         passed = "pass in " if record["verdict"] == "pass" else ""
         parts.append(f"{passed}attempt {record['attempt']} of {run['attempts']}")
+    if record["repetition"] and record["verdict"] in ("fail", "error"):
+        parts.append(f"seed {record['seed']}")
     return ", ".join(parts)
 
 
@@ -158,6 +161,20 @@ def text_end(records, of_experiments, interrupted, run, never_began):
         yield f"{end} {running} was running."
 
 
+def with_interrupted(records, interrupted, run):
+    """The records in the text and the CSV of an analysis, which have what the recorded run stopped in."""
+    if not interrupted or "analyzed" not in run or has_interruption(records):
+        return records
+    error = INTERRUPTION._replace(message=f"{interrupted} was interrupted")
+    return [*records, {"name": interrupted, "summary": "The recorded run stopped while this was running.", "verdict": "error",
+                       "skip": None, "attempt": None, "repetition": None, "trial": "", "results": [], "checks": [],
+                       "measurements": [], "errors": [error], "seed": run["seed"], "auxiliaryData": {}, "error stage": ""}]
+
+
+def has_interruption(records):
+    return bool(records) and records[-1]["errors"][:1] == [INTERRUPTION]
+
+
 def run_verdict(records, accepts_flaky):
     """The verdict of a run, from its last attempts."""
     verdicts = {"error" if one["verdict"] in ("pass", "fail") and (one["attempt"] or 1) > 1 and not accepts_flaky
@@ -226,16 +243,19 @@ class Comparison:
         self.check_identity(name, identity, streams, suites)
         rows = csv_reader.csv_rows(reports["csv"])
         seeds = self.without_identity(name, rows, identity)
+        never_began = sum(one.end["status"] == "SKIP" for one in streams[len(records):])
+        records = with_interrupted(records, interrupted, run)
         self.check(f"{name} csv: seeds", seeds, [str(one["seed"]) for one in records
                                                  for _ in range(csv_reader.lines_of(one, of_experiments))])
         self.compare_csv(name, rows, of_experiments, records)
-        never_began = sum(one.end["status"] == "SKIP" for one in streams[len(records):])
         end = list(text_end(records, of_experiments, interrupted, run, never_began))
         varies = any(one["varying"] for one in json.loads(reports["json"]).get("variation", []))
         lines = report_readers.Lines(reports["text"])
         begin = [line.decode("utf-8", "replace") for line in lines.block()]
         self.check(f"{name} text: begin", blurred(begin), blurred(text_begin(run)))
         self.compare_text(name, lines, of_experiments, records, varies, end)
+        counts = counts_line(records, of_experiments, never_began)
+        page_reader.compare(self, name, reports["html"], run, of_experiments, records, due, interrupted, counts)
 
     @staticmethod
     def is_superseded(records, place):
@@ -355,7 +375,7 @@ class Comparison:
                    [in_xml(one.start["name"]) for one in streams])
         ends = [{"ERROR": "error", "SKIP": None}[one.end["status"]] for one in streams]
         self.check(f"{name}: unrecorded verdicts", [report_readers.derived_verdict(one) for one in suites], ends)
-        has_record = bool(records) and records[-1]["errors"][:1] == [INTERRUPTION]
+        has_record = has_interruption(records)
         expected = int(interrupted is not None and not has_record)
         self.check(f"{name}: interrupted ones without a record", ends.count("error"), expected)
         if expected:
@@ -400,7 +420,7 @@ class Comparison:
             got = report_readers.read_text(lines, expected)
             self.check_record(f"{name} {place} text", blurred(got), blurred(expected))
         if any(one["repetition"] for one in records):
-            title = b"What varied between the repetitions" + b" (#: the first repetition with that value; Outlier: the one that differs most, and its seed)" * varies + b":"
+            title = b"What varied between the repetitions" + b" (#: the first repetition with that value; Outlier: the one whose rare value differs most, and its seed)" * varies + b":"
             self.check(f"{name} text: variation", lines.block()[0], title)
         left = [line.decode("utf-8", "replace") for line in lines.rest()]
         self.check(f"{name} text: end", blurred(left), blurred([*end, ""]))

@@ -4,7 +4,6 @@
 #include "host/cli/help_texts.h"
 #include "host/cli/option_checks.h"
 #include "host/cli/option_values.h"
-#include "host/cli/timeline_options.h"
 #include "host/device/phone.h"
 #include "host/text/table.h"
 #include "host/text/terminal.h"
@@ -48,7 +47,7 @@ struct RawOptions {
   std::string trace = "frames";
   std::string format = "text";
   ChoiceTexts choice;
-  TimelineTexts timeline;
+  ReportCommandTexts report;
   bool all = false;
   bool replace = false;
   bool realTime = false;
@@ -96,7 +95,7 @@ void removeMarks(RawOptions& raw) {
   }
   for (std::string* text : {&raw.profile, &raw.phone, &raw.record, &raw.of, &raw.seed, &raw.seeds, &raw.memory,
                             &raw.logLimit, &raw.trace, &raw.grace, &raw.choice.settle, &raw.choice.attempts,
-                            &raw.choice.repetitions, &raw.timeline.from, &raw.timeline.to}) {
+                            &raw.choice.repetitions, &raw.report.from, &raw.report.to}) {
     removeMark(*text);
   }
 }
@@ -293,7 +292,7 @@ Options optionsOf(const CLI::App& command, const RawOptions& raw) {
   checkPhone(command, options.phone);
   options.realTime = raw.realTime;
   options.choice = choiceOf(raw.choice);
-  options.part = timelinePartOf(raw.timeline);
+  if (options.command == Command::kReport) options.ofRecords = recordReportOf(raw.report, raw.records);
   options.inProcess = raw.inProcess;
   options.seed = parseWhole("--seed", raw.seed, 0, UINT64_MAX);
   if (const CLI::Option* const seed = command.get_option_no_throw("--seed")) options.hasSeed = seed->count() > 0;
@@ -312,7 +311,7 @@ Options optionsOf(const CLI::App& command, const RawOptions& raw) {
     options.tags = tagsOf(raw.tags, options.command != Command::kAnalyze);  // those of the record are kept
   }
   options.report = reportOf(raw, writesSeveralFormats(options.command));
-  if (options.command == Command::kReport) options.report.format = Format::kJson;
+  if (options.command == Command::kReport) options.report.format = formatOf(options.ofRecords);
   options.report.exitRules.allowSkips = options.choice.allowSkips;
   options.report.text.verbose = raw.verbose;
   options.report.shownLog = options.logLevel.value_or(LogLevel::kError);
@@ -339,7 +338,7 @@ void declareLookingCommands(CLI::App& app, RawOptions& raw) {
 }
 
 void declareRunningCommands(CLI::App& app, RawOptions& raw) {
-  const std::vector<std::string> formats = {"text", "json", "csv", "ocp", "junit"};
+  const std::vector<std::string> formats = {"text", "json", "csv", "ocp", "junit", "html"};
   CLI::App& run = *app.add_subcommand("run", "Run diagnostics: measure, then compare the results with their limits");
   addNames(run, raw.names, "A diagnostic's");
   run.add_option("--only", raw.only,
@@ -378,9 +377,9 @@ void declareOtherCommands(CLI::App& app, RawOptions& raw) {
   addRecords(verify, raw, 1, CLI::detail::expected_max_vector_size, "The records, or folders of them");
   CLI::App& diff = *app.add_subcommand("diff", "Show the differences between two records");
   addRecords(diff, raw, 2, 2, "The two records");
-  CLI::App& report = *app.add_subcommand("report", "Make a time line of a record, for a viewer of traces");
-  addRecords(report, raw, 1, 1, "The record");
-  addTimelineOptions(report, raw.timeline);
+  CLI::App& report = *app.add_subcommand("report", "Make a page of records for people, or a time line of one");
+  addRecords(report, raw, 1, CLI::detail::expected_max_vector_size, "The records, or folders of them");
+  addReportCommandOptions(report, raw.report);
   addOutput(report, raw);
   CLI::App& explain = *app.add_subcommand("explain", "Explain an error, a diagnostic or a result, and what to do next");
   explain

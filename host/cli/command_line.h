@@ -3,12 +3,12 @@
 
 #include "contract/log_channel.h"
 #include "host/cli/choice_options.h"
+#include "host/cli/report_command_options.h"
 #include "host/error/exit_code.h"
 #include "host/limits/user_limit.h"
 #include "host/plugin/parameters.h"
 #include "host/plugin/profile.h"
 #include "host/report/run_report.h"
-#include "host/report/timeline.h"
 #include "host/run/deadlines.h"
 #include "host/run/frame_teller.h"
 #include "host/run/log_limit.h"
@@ -79,7 +79,7 @@ struct Options {
   std::optional<LogLevel> logLevel;
   LogLimit logLimit;  // of each diagnostic
   TraceSetting trace;
-  TimelinePart part;  // of a time line to write
+  RecordReport ofRecords;  // what report makes of records
   Command command = Command::kList;
   bool all = false;
   bool onlyFailed = false;

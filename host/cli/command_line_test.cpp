@@ -189,7 +189,7 @@ TEST(ParseCommandLine, KnowsItsCommands) {
                       {{"verify", "r"}, Command::kVerify},
                       {{"analyze", "r"}, Command::kAnalyze},
                       {{"diff", "r", "s"}, Command::kDiff},
-                      {{"report", "r", "--format", "trace"}, Command::kReport},
+                      {{"report", "r", "s"}, Command::kReport},
                       {{"explain", "206"}, Command::kExplain},
                       {{"doctor"}, Command::kDoctor},
                       {{"selftest"}, Command::kSelftest},

@@ -39,6 +39,7 @@ constexpr Example kExamples[] = {
     {"quazor verify run.jsonl", "check that the recorded verdicts follow from the data"},
     {"quazor analyze run.jsonl --set analysis.frameCount=60", "judge the recorded measurements again"},
     {"quazor diff before.jsonl after.jsonl", "show what differs between two records"},
+    {"quazor report run.jsonl --output report.html", "a page of a run for people"},
     {"quazor report run.jsonl --format trace --output run.trace.json", "a time line for a viewer of traces"},
     {"quazor explain QZCapturePlugInErrorDomain:206", "what an error means, and what to do next"},
     {"quazor doctor", "check the installation"},

@@ -250,7 +250,9 @@ class IncompleteRecordTest(RecordTest):
         def cut(events):
             del events[ends[0] + 2:]
 
-        self.refuse_green(self.changed(cut), running)
+        result, _ = self.refuse_green(self.changed(cut), running)
+        self.assertIn(f"ERROR {running}\n", result.stdout)
+        self.assertIn("2 diagnostics: 1 passed, 0 failed, 1 ended in an error\n", result.stdout)
 
         def cut_between(events):
             del events[ends[0] + 1:]

@@ -110,7 +110,7 @@ ExitCode perform(const Options& options, const Installation& installation, Conso
     case Command::kVerify: return verifyCommand(options, console, watchSignals(options));
     case Command::kAnalyze: return analyzeCommand(options, installation, console, watchSignals(options));
     case Command::kDiff: return diffCommand(options, console);
-    case Command::kReport: return reportCommand(options, console);
+    case Command::kReport: return reportCommand(options, installation, console);
     case Command::kExplain: return explainErrors(options, installation, console);
     case Command::kDoctor:
       return doctorCommand(options, installation, console, options.plugins.empty() ? nullptr : watchSignals(options));

@@ -36,9 +36,9 @@ ExitCode verifyCommand(const Options& options, Console& console, WatchedSignals*
 // CommandError (kCannotRead).
 ExitCode diffCommand(const Options& options, Console& console);
 
-// report: writes the time line of a record, also of one whose run did not end, which it says. Throws a CommandError:
-// kCannotRead for a record that cannot be read, kUsage if the time line would be too large.
-ExitCode reportCommand(const Options& options, Console& console);
+// report: writes the page of records, or the time line of one, also of those whose run did not end, which it says.
+// Throws a CommandError: kCannotRead for a record that cannot be read, kUsage if the time line would be too large.
+ExitCode reportCommand(const Options& options, const Installation& installation, Console& console);
 
 // doctor: prints one line per plug-in, backend and file that quazor would use: accepted, or refused with the reason.
 // kAllPassed if nothing is refused, else kCannotRead. With plug-ins in the options, prints what a reviewer would find

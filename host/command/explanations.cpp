@@ -359,20 +359,27 @@ std::vector<const Explanation*> findExplanations(const std::vector<Explanation>&
   return found;
 }
 
-std::function<bool(const std::string& topic)> explainedTopics(std::vector<std::filesystem::path> directories) {
-  return [directories = std::move(directories),
-          all = std::optional<std::vector<Explanation>>()](const std::string& topic) mutable {
-    if (!all) {
+std::function<const Explanation*(const std::string& topic)> explanationFinder(
+    std::vector<std::filesystem::path> directories) {
+  return [directories = std::move(directories), all = std::make_shared<std::optional<std::vector<Explanation>>>()](
+             const std::string& topic) -> const Explanation* {
+    if (!*all) {
       try {
-        all = readExplanations(directories);
+        *all = readExplanations(directories);
       } catch (const InputError&) {
-        all.emplace();
+        all->emplace();
       }
     }
-    return std::ranges::any_of(*all, [&topic](const Explanation& one) {
+    const auto found = std::ranges::find_if(**all, [&topic](const Explanation& one) {
       return one.isError() ? keyOf(one.domain, one.code) == topic : holds(one.names, topic);
     });
+    return found == (*all)->end() ? nullptr : &*found;
   };
+}
+
+std::function<bool(const std::string& topic)> explainedTopics(std::vector<std::filesystem::path> directories) {
+  return
+      [find = explanationFinder(std::move(directories))](const std::string& topic) { return find(topic) != nullptr; };
 }
 
 }  // namespace quazor

@@ -5,6 +5,7 @@
 #include "base/json/json_document.h"
 #include "contract/parameter_range.h"
 #include "host/plugin/parameters.h"
+#include "host/report/page/advice.h"
 
 #include <cstdint>
 #include <filesystem>
@@ -31,7 +32,8 @@ struct ExplainedParameter {
 };
 
 // One explanation. An error has a domain and a code, everything else has names.
-struct Explanation {
+// Thread: one at a time; any number may read while none changes it.
+struct Explanation : Advice {
   std::string domain;                // empty unless this explains an error
   std::int64_t code = 0;             // of an error
   std::vector<std::string> symbols;  // of an error: its code's names in the source
@@ -40,12 +42,6 @@ struct Explanation {
   std::vector<std::string> names;
   std::string kind;               // without a domain: "diagnostic", "experiment", "analysis" or "result"
   std::vector<std::string> from;  // of a result: the diagnostics and experiments that report it
-
-  std::string title;  // one line
-  std::string meaning;
-  std::string failing;              // what a failing result means; empty for an error
-  std::vector<std::string> causes;  // the most likely first
-  std::vector<std::string> next;    // steps, in order
 
   std::vector<ExplainedParameter> parameters;  // of an experiment or analysis
   std::shared_ptr<const JsonDocument> document;
@@ -80,6 +76,12 @@ void addExplainedRanges(const std::vector<std::filesystem::path>& directories,
 // name, if it selects none.
 std::vector<const Explanation*> findExplanations(const std::vector<Explanation>& explanations,
                                                  const std::string& asked);
+
+// A function that finds the explanation of an error, as DOMAIN:CODE, or of a name in the directories, which are read at
+// the first call; null if there is none, or if they cannot be read. What it returns is valid as long as the function or
+// a copy of it. Thread: one at a time.
+std::function<const Explanation*(const std::string& topic)> explanationFinder(
+    std::vector<std::filesystem::path> directories);
 
 // A function that tells whether an error, as DOMAIN:CODE, or a name has an explanation in the directories. They
 // are read at the first call; if they cannot be read, nothing has an explanation. Thread: one at a time.

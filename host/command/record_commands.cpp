@@ -6,7 +6,6 @@
 #include "host/record/verification.h"
 #include "host/report/progress.h"
 #include "host/report/record_difference.h"
-#include "host/report/timeline.h"
 #include "host/text/table.h"
 
 #include <algorithm>
@@ -230,25 +229,6 @@ ExitCode diffCommand(const Options& options, Console& console) {
   if (differences.empty()) answer << "The records do not differ.\n";
   writeOutput(options.report, console, answer.str());
   return differences.empty() ? ExitCode::kAllPassed : ExitCode::kFailed;
-}
-
-ExitCode reportCommand(const Options& options, Console& console) {
-  const std::filesystem::path& file = options.records.front();
-  refuseFolderAsRecord(file);
-  const StoredRecord record = readRecord(file);
-  try {
-    writeOutput(options.report, console, timelineText(record.events, options.part));
-  } catch (const TimelineTooLarge& refusal) {
-    throw CommandError(ExitCode::kUsage,
-                       formatMessage("%@: %@, which few viewers open; --from SECONDS and --to SECONDS "
-                                     "choose a part of it",
-                                     file.string(), refusal.what()));
-  }
-  if (!std::holds_alternative<RunEnded>(record.events.back())) {
-    console.err << "quazor: " << printable(file.string())
-                << ": the run did not end; the time line ends with the record\n";
-  }
-  return ExitCode::kAllPassed;
 }
 
 }  // namespace quazor

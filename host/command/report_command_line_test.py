@@ -1,4 +1,4 @@
-"""The time line of a record: quazor report."""
+"""The page and the time line of a record: quazor report."""
 
 import json
 import os
@@ -64,8 +64,11 @@ class TimelineTest(RecordTest):
         self.run_diagnostics()
         for arguments, code, text in [
                 (["report"], 64, "RECORD"),
-                (["report", self.record], 64, "--format"),
-                (["report", self.record, "--format", "html"], 64, "trace"),
+                (["report", self.record, "--format", "pdf"], 64, "html"),
+                (["report", self.record, "--from", "1"], 64, "--from applies only to --format trace"),
+                (["report", self.record, "--to", "1"], 64, "--to applies only to --format trace"),
+                (["report", self.record, "--format", "trace", "--no-frames"], 64, "--no-frames applies only to"),
+                (["report", self.record, self.record, "--format", "trace"], 64, "a time line is of one record"),
                 (["report", self.record, "--format", "trace", "--from", "x"], 64, "--from 'x'"),
                 (["report", self.record, "--format", "trace", "--from", "-1"], 64, "less than zero"),
                 (["report", self.record, "--format", "trace", "--from", "2", "--to", "1"], 64, "--to '1'"),
@@ -102,6 +105,93 @@ class TimelineTest(RecordTest):
         self.assertIn("--from SECONDS and --to SECONDS", result.stderr)
         self.assertFalse((self.directory / "o").exists())
         self.report("--from", "1000", "--output", self.directory / "o")
+
+
+class PageTest(RecordTest):
+    def run_all(self, *arguments, code=0):
+        result = quazor("run", "--all", "--record", self.record, *arguments)
+        self.assertEqual(result.returncode, code, result.stderr)
+
+    def page(self, *arguments, code=0):
+        result = quazor("report", *arguments)
+        self.assertEqual((result.returncode, result.stderr), (code, ""))
+        return result.stdout
+
+    def test_a_run_and_its_record_have_the_same_page(self):
+        page = self.directory / "run.html"
+        self.run_all("--output", f"html:{page}")
+        again = self.page(self.record).replace(
+            f'<tr><th scope="row">Record</th><td>{self.record}</td></tr>\n', "")
+        self.assertEqual(again, page.read_text())
+        self.assertEqual(again, self.page(self.record, "--format", "html").replace(
+            f'<tr><th scope="row">Record</th><td>{self.record}</td></tr>\n', ""))
+        self.assertIn("Stream front-infrared", again)
+        self.assertLess(len(again.encode()), 150_000)
+
+    def test_a_failure_is_explained(self):
+        self.run_all("--phone", "camera_sync/frames_dropped", "--profile", "strict", code=1)
+        page = self.page(self.record)
+        self.assertIn("<strong>BackTele.Total</strong> is <strong>87 frames</strong>, <strong>3 below the limit</strong>", page)
+        self.assertIn("What to do next", page)
+        self.assertIn("quazor explain BackTele.Total", page)
+
+    def test_without_frames(self):
+        self.run_all()
+        self.assertNotIn("Stream front-infrared", self.page(self.record, "--no-frames"))
+
+    def test_two_records_compared(self):
+        self.run_all()
+        other = self.directory / "other.jsonl"
+        result = quazor("run", "--all", "--record", other, "--phone", "camera_sync/frames_dropped")
+        self.assertEqual(result.returncode, 0, result.stderr)
+        page = self.page(self.record, other, "--compare")
+        differences = quazor("diff", self.record, other).stdout.splitlines()
+        self.assertGreater(len(differences), 5)
+        self.assertIn(f"The records differ in {len(differences)} places", page)
+        self.assertIn("TesselFaultDiagnostic: stream front-infrared", page)
+        self.assertIn('class="curve1"', page)
+        self.assertNotIn("<svg", self.page(self.record, other, "--compare", "--no-frames"))
+        self.assertIn("The records do not differ", self.page(self.record, self.record, "--compare"))
+
+    def test_a_folder_of_records(self):
+        self.run_all()
+        (self.directory / "other.jsonl").write_bytes(self.record.read_bytes())
+        page = self.page(self.directory)
+        self.assertIn("2 runs: 2 passed, 0 did not", page)
+        self.assertLess(page.index("The runs of this page"), page.index('id="run1"'))
+        self.assertIn('id="run2"', page)
+
+    def test_a_record_that_was_cut(self):
+        """At every line, there is a page that says so."""
+        self.run_all()
+        lines = self.record.read_text().splitlines(keepends=True)
+        for count in range(1, len(lines), 7):
+            self.record.write_text("".join(lines[:count]))
+            result = quazor("report", self.record)
+            self.assertEqual(result.returncode, 0, result.stderr)
+            self.assertIn("the run did not end; the page ends with the record", result.stderr)
+            self.assertIn('<p class="stop">The run did not come to its end', result.stdout)
+            self.assertIn('<span class="word">ERROR</span>', result.stdout)
+
+    def test_mistakes(self):
+        self.run_all()
+        noise = self.directory / "noise"
+        noise.write_text("no record\n")
+        for arguments, code, text in [
+                (["report", noise], 66, "noise"),
+                (["report", self.record, "--compare"], 64, "--compare takes two records, but there are 1"),
+                (["report", self.record, noise, "--compare"], 66, "noise"),
+                (["report", self.record, self.directory, "--compare"], 66, "folder"),
+                (["report", self.record, noise], 66, "noise"),
+                (["report", self.directory / "missing"], 66, "missing"),
+                (["report", self.record, "--output", self.record], 73, "is a record"),
+                (["report", self.record, "--output", "/dev/full"], 73, "/dev/full"),
+                (["report", self.record, "--output", self.directory / "no" / "page.html"], 73, "page.html"),
+        ]:
+            with self.subTest(arguments=arguments):
+                result = quazor(*arguments)
+                self.assertEqual(result.returncode, code, result.stderr)
+                self.assertIn(text, result.stderr)
 
 
 if __name__ == "__main__":

@@ -7,6 +7,7 @@
 #include "host/command/explanations.h"
 #include "host/command/failed_only.h"
 #include "host/command/output_check.h"
+#include "host/command/report_command.h"
 #include "host/command/selection.h"
 #include "host/device/phone.h"
 #include "host/error/host_error.h"
@@ -94,6 +95,7 @@ std::unique_ptr<EventPipeline> beginEvents(Options options, const Installation& 
   outputs.systemLog = options.systemLog;
   outputs.report = options.report;
   outputs.report.text.isExplained = explainedTopics(installation.explanations());
+  outputs.report.text.page = pageWriter(installation);
   outputs.report.text.allowSkips = options.choice.allowSkips;
   outputs.logLimit = options.logLimit;
   return std::make_unique<EventPipeline>(outputs, console);

@@ -53,6 +53,21 @@ UnrecordedDiagnostics unrecordedDiagnosticsOf(const RunStarted& run, const std::
   return unrecorded;
 }
 
+std::vector<DiagnosticRecord> withInterruptedOfAnalysis(const RunStarted& run, std::vector<DiagnosticRecord> records,
+                                                        const std::optional<std::string>& interrupted) {
+  if (!run.analyzed || run.ofExperiments) return records;
+  const std::optional<std::string> name = unrecordedDiagnosticsOf(run, records, interrupted).interrupted;
+  if (!name || name->empty()) return records;
+  DiagnosticRecord record;
+  record.name = *name;
+  record.summary = "The recorded run stopped while this was running.";
+  record.seed = run.seed;
+  record.verdict = Verdict::kError;
+  record.error = interruptionOf(run, *name);
+  records.push_back(std::move(record));
+  return records;
+}
+
 DiagnosticErrorPtr interruptionOf(const RunStarted& run, const std::string& interrupted) {
   const std::string idle =
       run.ofExperiments ? "interrupted while no experiment was running" : "interrupted while no diagnostic was running";

@@ -30,6 +30,11 @@ std::vector<PlannedDiagnostic> missingOf(const RunStarted& run, const std::vecto
 UnrecordedDiagnostics unrecordedDiagnosticsOf(const RunStarted& run, const std::vector<DiagnosticRecord>& records,
                                               const std::optional<std::string>& interrupted);
 
+// The records, of an analysis followed by one for the diagnostic in which the recorded run stopped: it has nothing to
+// analyze and so no record of its own.
+std::vector<DiagnosticRecord> withInterruptedOfAnalysis(const RunStarted& run, std::vector<DiagnosticRecord> records,
+                                                        const std::optional<std::string>& interrupted);
+
 // The error to report for an interruption that no record shows. `interrupted` is the diagnostic that was running, or
 // empty.
 DiagnosticErrorPtr interruptionOf(const RunStarted& run, const std::string& interrupted);

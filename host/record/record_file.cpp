@@ -164,17 +164,25 @@ class FrameOrder {
   std::map<std::string, std::int64_t, std::less<>> delivered_;  // the last frame of each stream of the diagnostic
 };
 
-// Moves the frames to the stream of that name.
+}  // namespace
+
+std::uint64_t RecordedStream::stepAt(std::size_t index) const {
+  const auto after = std::upper_bound(steps.begin(), steps.end(), index,
+                                      [](std::size_t at, const TracedStep& one) { return at < one.first; });
+  return after == steps.begin() ? 1 : (after - 1)->step;
+}
+
 void addFrames(std::vector<RecordedStream>& streams, FramesTraced&& event) {
   auto stream = std::find_if(streams.begin(), streams.end(),
                              [&event](const RecordedStream& one) { return one.name == event.stream; });
   if (stream == streams.end()) stream = streams.insert(streams.end(), {event.stream, {}, 0});
+  if (stream->steps.empty() || stream->steps.back().step != event.step) {
+    stream->steps.push_back({stream->frames.size(), event.step});
+  }
   stream->frames.insert(stream->frames.end(), event.frames.begin(), event.frames.end());
   stream->lost += event.lost;
   event.frames = {};
 }
-
-}  // namespace
 
 std::string recordLine(const RunEvent& event, std::uint64_t sequence) {
   Json line = {{"sequence", sequence}};

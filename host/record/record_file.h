@@ -84,12 +84,25 @@ StoredRecord readRecord(const std::filesystem::path& file,
 // True if the first line of the file is that of a record. False for a file that cannot be read.
 bool isRecord(const std::filesystem::path& file);
 
+// From the frame at this index on, one of `step` frames is told.
+struct TracedStep {
+  std::size_t first = 0;
+  std::uint64_t step = 1;
+};
+
 // The frames of a stream in one run of a diagnostic.
 struct RecordedStream {
   std::string name;
   std::vector<TracedFrame> frames;  // in the order of their delivery
   std::uint64_t lost = 0;
+  std::vector<TracedStep> steps{};  // ascending
+
+  // The step at the frame with that index.
+  std::uint64_t stepAt(std::size_t index) const;
 };
+
+// Moves the frames to the stream of that name, a new one at first.
+void addFrames(std::vector<RecordedStream>& streams, FramesTraced&& event);
 
 // The run stored in a record. Incomplete diagnostics have the verdict kError.
 struct RecordedRun {

@@ -53,9 +53,10 @@ std::string_view nameOf(Format format) {
     case Format::kJson: return "json";
     case Format::kCsv: return "csv";
     case Format::kOcp: return "ocp";
-    case Format::kJunit: break;
+    case Format::kJunit: return "junit";
+    case Format::kHtml: break;
   }
-  return "junit";
+  return "html";
 }
 
 std::optional<Format> formatNamed(std::string_view name) {
@@ -98,9 +99,9 @@ OutputRequest parseOutput(const std::string& text, Format usual) {
 }
 
 std::optional<Format> otherFormatOfSuffix(const OutputRequest& output) {
-  constexpr std::pair<std::string_view, Format> kSuffixes[] = {{".txt", Format::kText},  {".log", Format::kText},
-                                                               {".json", Format::kJson}, {".jsonl", Format::kOcp},
-                                                               {".csv", Format::kCsv},   {".xml", Format::kJunit}};
+  constexpr std::pair<std::string_view, Format> kSuffixes[] = {
+      {".txt", Format::kText}, {".log", Format::kText},  {".json", Format::kJson}, {".jsonl", Format::kOcp},
+      {".csv", Format::kCsv},  {".xml", Format::kJunit}, {".html", Format::kHtml}, {".htm", Format::kHtml}};
   std::string suffix = output.file.extension().string();
   std::transform(suffix.begin(), suffix.end(), suffix.begin(),
                  [](char unit) { return unit >= 'A' && unit <= 'Z' ? static_cast<char>(unit - 'A' + 'a') : unit; });
@@ -113,16 +114,23 @@ std::optional<Format> otherFormatOfSuffix(const OutputRequest& output) {
 }
 
 std::string reportText(Format format, const RunStarted& run, const std::vector<DiagnosticRecord>& records,
-                       const std::optional<std::string>& interrupted, const TextContent& text) {
+                       const std::optional<std::string>& interrupted, const TextContent& text,
+                       const RunStreams& streams) {
   switch (format) {
     case Format::kText: return textReport(run, records, interrupted, text);
     case Format::kCsv: {
       std::vector<std::uint64_t> seeds;
-      const std::string csv = run.ofExperiments ? experimentCsv(records, &seeds) : diagnosticCsv(records, &seeds);
+      const std::string csv = run.ofExperiments
+                                  ? experimentCsv(records, &seeds)
+                                  : diagnosticCsv(withInterruptedOfAnalysis(run, records, interrupted), &seeds);
       return withRunColumns(csv, run, seeds);
     }
     case Format::kOcp: return ocpReport(run, records, interrupted);
     case Format::kJunit: return junitReport(run, records, interrupted, {text.allowSkips, run.acceptFlaky});
+    case Format::kHtml: {
+      const std::vector<DiagnosticRecord> all = withInterruptedOfAnalysis(run, records, interrupted);
+      return text.page({run, all, streams, interrupted});
+    }
     case Format::kJson: break;
   }
   nlohmann::ordered_json document =
@@ -149,11 +157,13 @@ void printReport(std::ostream& out, const RunStarted& run, const DiagnosticRecor
   }
 }
 
-void printEnd(std::ostream& out, const RunStarted& run, const std::vector<DiagnosticRecord>& records,
+void printEnd(std::ostream& out, const RunStarted& run, const std::vector<DiagnosticRecord>& finished,
               const std::optional<std::string>& interrupted, const TextContent& text, bool colour) {
   const bool endsWithRepetition =
-      !records.empty() && !text.verbose && !run.ofExperiments && records.back().trial.repetition > 0;
+      !finished.empty() && !text.verbose && !run.ofExperiments && finished.back().trial.repetition > 0;
   if (endsWithRepetition) out << '\n';
+  const std::vector<DiagnosticRecord> records = withInterruptedOfAnalysis(run, finished, interrupted);
+  if (records.size() > finished.size()) printReport(out, run, records.back(), {colour, false, text.verbose});
   printVariation(out, records);
   if (records.size() != 1 || interrupted) {
     const std::size_t notReached = interrupted ? unrecordedDiagnosticsOf(run, records, interrupted).neverRun.size() : 0;

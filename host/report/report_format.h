@@ -2,6 +2,7 @@
 #pragma once
 
 #include "host/model/run_event.h"
+#include "host/record/record_file.h"
 #include "host/report/text_report.h"
 
 #include <filesystem>
@@ -13,11 +14,12 @@
 
 namespace quazor {
 
-enum class Format { kText, kJson, kCsv, kOcp, kJunit };
+enum class Format { kText, kJson, kCsv, kOcp, kJunit, kHtml };
 
-inline constexpr Format kFormats[] = {Format::kText, Format::kJson, Format::kCsv, Format::kOcp, Format::kJunit};
+inline constexpr Format kFormats[] = {Format::kText, Format::kJson,  Format::kCsv,
+                                      Format::kOcp,  Format::kJunit, Format::kHtml};
 
-std::string_view nameOf(Format format);  // "text", "json", "csv", "ocp", "junit"
+std::string_view nameOf(Format format);  // "text", "json", "csv", "ocp", "junit", "html"
 
 // The format with that name, or nothing.
 std::optional<Format> formatNamed(std::string_view name);
@@ -35,25 +37,41 @@ OutputRequest parseOutput(const std::string& text, Format usual);
 // The format that the suffix of the file suggests, if the report has another; nothing for other suffixes.
 std::optional<Format> otherFormatOfSuffix(const OutputRequest& output);
 
+// The frames of each record of a run; empty if they are not known.
+using RunStreams = std::vector<std::vector<RecordedStream>>;
+
+// A run as a page shows it. Borrows all but its last members.
+struct ShownRun {
+  const RunStarted& began;
+  const std::vector<DiagnosticRecord>& records;
+  const RunStreams& streams;
+  std::optional<std::string> interrupted{};  // as in RunEnded; without an end, the diagnostic that was running
+  bool hasEnded = true;
+  std::string file{};  // of the record; empty: none
+};
+
 // What the text reports of a run show.
 struct TextContent {
   bool verbose = false;  // every result of a diagnostic
   // True for what `quazor explain` explains; without the function, nothing is.
   std::function<bool(const std::string& topic)> isExplained{};
-  bool allowSkips = false;  // a skipped diagnostic does not make the exit code 2
+  bool allowSkips = false;                                 // a skipped diagnostic does not make the exit code 2
+  std::function<std::string(const ShownRun& run)> page{};  // writes the HTML page (page/page.h)
 };
 
 // The complete report of a run. `interrupted` as in RunEnded. `text` only matters for kText, but
-// `allowSkips` also for kJunit.
+// `allowSkips` also for kJunit, and `page`, which is then required, for kHtml, as `streams` do.
 std::string reportText(Format format, const RunStarted& run, const std::vector<DiagnosticRecord>& records,
-                       const std::optional<std::string>& interrupted, const TextContent& text = {});
+                       const std::optional<std::string>& interrupted, const TextContent& text = {},
+                       const RunStreams& streams = {});
 
 // Prints the text report of one record of the run; nothing if that report only counts it (variation_report.h).
 void printReport(std::ostream& out, const RunStarted& run, const DiagnosticRecord& record, TextStyle style);
 
-// Prints the end of the text report: the number of records per verdict, unless there is only one and the run was not
-// interrupted, and what did not pass (short_report.h).
-void printEnd(std::ostream& out, const RunStarted& run, const std::vector<DiagnosticRecord>& records,
+// Prints the end of the text report: of an analysis, the diagnostic in which the recorded run stopped; the number of
+// records per verdict, unless there is only one and the run was not interrupted, and what did not pass
+// (short_report.h).
+void printEnd(std::ostream& out, const RunStarted& run, const std::vector<DiagnosticRecord>& finished,
               const std::optional<std::string>& interrupted, const TextContent& text, bool colour);
 
 }  // namespace quazor

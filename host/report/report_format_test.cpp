@@ -22,7 +22,7 @@ using testing::HasSubstr;
 using testing::StartsWith;
 
 TEST(Formats, HaveNamesByWhichTheyAreFound) {
-  constexpr std::string_view kNames[] = {"text", "json", "csv", "ocp", "junit"};
+  constexpr std::string_view kNames[] = {"text", "json", "csv", "ocp", "junit", "html"};
   for (std::size_t i = 0; i < std::size(kFormats); ++i) {
     EXPECT_EQ(nameOf(kFormats[i]), kNames[i]);
     EXPECT_EQ(formatNamed(kNames[i]), kFormats[i]);
@@ -135,6 +135,20 @@ TEST_F(ReportTextTest, CountsOneRecordOnlyWhenTheRunWasInterrupted) {
   EXPECT_THAT(report(Format::kText, "B"), EndsWith("an error\nInterrupted while B was running.\n"));
   EXPECT_THAT(report(Format::kText, "B\n"), EndsWith("\nInterrupted while B\\x0a was running.\n"));
   EXPECT_EQ(nlohmann::json::parse(report(Format::kJson, "B"))["interrupted"], "B");
+}
+
+TEST_F(ReportTextTest, HasWhatWasInterruptedInTheRecordOfAnAnalysis) {
+  records_.pop_back();
+  run_.analyzed.emplace();
+  const std::string text = report(Format::kText, "B");
+  EXPECT_THAT(text, testing::AllOf(HasSubstr("\nERROR B\n  The recorded run stopped while this was running.\n\n  "
+                                             "QuazorHostErrorDomain code 11: B was interrupted\n"),
+                                   HasSubstr("2 diagnostics: 1 passed, 0 failed, 1 ended in an error\n"),
+                                   HasSubstr("\nERROR B: QuazorHostErrorDomain code 11\n")));
+  EXPECT_THAT(report(Format::kCsv, "B"), HasSubstr("\nB,error,,,,,,,,,,,,QuazorHostErrorDomain,11,B was interrupted,"));
+  for (const Format format : {Format::kText, Format::kCsv}) {
+    EXPECT_THAT(report(format, ""), testing::Not(HasSubstr("code 11"))) << nameOf(format);
+  }
 }
 
 }  // namespace

@@ -29,10 +29,19 @@ std::string suffixOf(const DiagnosticStarted& diagnostic, const RunStarted& run)
   return trial.empty() ? trial : ", " + trial;
 }
 
+bool hasPage(const ReportOptions& options) {
+  return options.format == Format::kHtml ||
+         std::any_of(options.outputs.begin(), options.outputs.end(),
+                     [](const OutputRequest& output) { return output.format == Format::kHtml; });
+}
+
 }  // namespace
 
 RunReport::RunReport(ReportOptions options, Console& console)
-    : options_(std::move(options)), console_(console), progress_(console.showsProgress ? &console.err : nullptr) {}
+    : options_(std::move(options)),
+      console_(console),
+      progress_(console.showsProgress ? &console.err : nullptr),
+      keepsFrames_(hasPage(options_)) {}
 
 void RunReport::onEvent(const RunEvent& event) {
   if (const auto* const began = std::get_if<RunStarted>(&event)) {
@@ -53,6 +62,10 @@ void RunReport::onEvent(const RunEvent& event) {
     });
   } else if (const auto* const heartbeat = std::get_if<Heartbeat>(&event)) {
     tell(*heartbeat);
+  } else if (const auto* const traced = std::get_if<FramesTraced>(&event)) {
+    if (!keepsFrames_) return;
+    streams_.resize(records_.size() + 1);
+    addFrames(streams_.back(), FramesTraced(*traced));
   } else if (const auto* const ended = std::get_if<RunEnded>(&event)) {
     finishRun(*ended);
   }
@@ -118,7 +131,7 @@ void RunReport::finishRun(const RunEnded& event) {
     printEnd(console_.out, run_, records_, interrupted, options_.text, console_.colour);
   }
   if (!toFile && options_.format != Format::kText) {
-    writeUnfolded(console_.out, reportText(options_.format, run_, records_, interrupted, options_.text));
+    writeUnfolded(console_.out, reportAs(options_.format, interrupted));
   }
   console_.out.flush();
   if (interrupted) console_.err << "quazor: " << interruptionText(run_, *interrupted) << '\n';
@@ -131,9 +144,13 @@ void RunReport::finishRun(const RunEnded& event) {
   console_.err.flush();
 }
 
+std::string RunReport::reportAs(Format format, const std::optional<std::string>& interrupted) const {
+  return reportText(format, run_, records_, interrupted, options_.text, streams_);
+}
+
 void RunReport::writeFile(const OutputRequest& output, const std::optional<std::string>& interrupted) {
   try {
-    writeOutputFile(output.file, reportText(output.format, run_, records_, interrupted, options_.text));
+    writeOutputFile(output.file, reportAs(output.format, interrupted));
   } catch (const CommandError& problem) {
     console_.err << "quazor: " << printable(problem.what()) << '\n';
     allWritten_ = false;

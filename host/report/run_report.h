@@ -69,6 +69,7 @@ class RunReport final : public RunEventSink {
   // After the last record of a repetition.
   void endRepetition();
   void finishRun(const RunEnded& event);
+  std::string reportAs(Format format, const std::optional<std::string>& interrupted) const;
   void writeFile(const OutputRequest& output, const std::optional<std::string>& interrupted);
 
   const ReportOptions options_;
@@ -78,6 +79,8 @@ class RunReport final : public RunEventSink {
   std::string running_;     // the diagnostic that began last
   std::size_t number_ = 0;  // its place among those to run
   std::vector<DiagnosticRecord> records_;
+  const bool keepsFrames_;  // for a page
+  RunStreams streams_;
   bool allWritten_ = true;
 };
 

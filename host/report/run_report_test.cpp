@@ -213,6 +213,7 @@ TEST_F(RunReportTest, WritesFurtherReportsInTheirFormats) {
   for (const Format format : kFormats) {
     options.outputs.push_back({format, directory_.path() / std::string(nameOf(format))});
   }
+  options.text.page = [](const ShownRun& shown) { return "page of " + shown.records.front().name; };
   RunReport report(options, console_);
   run(report, {Verdict::kPass});
   EXPECT_FALSE(std::filesystem::exists(directory_.path() / "text"));
@@ -223,6 +224,34 @@ TEST_F(RunReportTest, WritesFurtherReportsInTheirFormats) {
   EXPECT_THAT(directory_.read("csv"), testing::StartsWith("diagnostic,verdict,result,"));
   EXPECT_THAT(directory_.read("junit"), testing::StartsWith("<?xml"));
   EXPECT_THAT(directory_.read("ocp"), testing::StartsWith("{\"schemaVersion\""));
+  EXPECT_EQ(directory_.read("html"), "page of A");
+}
+
+TEST_F(RunReportTest, GivesThePageTheFramesOfEachDiagnostic) {
+  ReportOptions options;
+  options.outputs.push_back({Format::kHtml, directory_.path() / "page"});
+  RunStreams streams;
+  options.text.page = [&streams](const ShownRun& shown) {
+    streams = shown.streams;
+    return std::string();
+  };
+  RunReport report(options, console_);
+  report.onEvent(runOf({"A", "B", "C"}));
+  for (const char* const name : {"A", "B", "C"}) {
+    report.onEvent(beginningOf(name));
+    const std::string diagnostic = name;
+    if (diagnostic != "A") {
+      for (std::int64_t number : {1, 2}) report.onEvent(FramesTraced{"of " + diagnostic, 1, {{number, 0, 0, {}}}, 0});
+    }
+    report.addRecord(recordOf(name, Verdict::kPass));
+  }
+  EXPECT_EQ(end(report), ExitCode::kAllPassed);
+  ASSERT_EQ(streams.size(), 3U);
+  EXPECT_TRUE(streams[0].empty());
+  ASSERT_EQ(streams[1].size(), 1U);
+  EXPECT_EQ(streams[1][0].name, "of B");
+  EXPECT_EQ(streams[1][0].frames.size(), 2U);
+  EXPECT_EQ(streams[2][0].name, "of C");
 }
 
 TEST_F(RunReportTest, WritesTheOtherReportsWhenOneCannotBeWritten) {

@@ -18,6 +18,10 @@ std::string resultCountsText(const DiagnosticRecord& record);
 // (text_report.h) and, unless the diagnostic passed, its summary and its error. The name is padded to `nameWidth`.
 void printShortRecord(std::ostream& out, const DiagnosticRecord& record, bool colour, std::size_t nameWidth);
 
+// What to ask `quazor explain` about a diagnostic that did not pass, the most specific first: its error, or its results
+// that failed, and then its name.
+std::vector<std::string> topicsOf(const DiagnosticRecord& record);
+
 // Prints a line for each diagnostic that did not pass or that passed only after an error, with the results that failed
 // or with its error, and then the command that explains them; nothing if all passed. The command names only what
 // `isExplained` accepts.

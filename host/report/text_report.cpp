@@ -200,9 +200,11 @@ std::string errorText(const DiagnosticErrorPtr& error, std::string_view indent) 
 std::string_view errorStageText(const DiagnosticRecord& record) {
   if (record.error == nullptr) return {};
   if (record.errorStage) return nameOf(*record.errorStage);
-  const bool isOfRecord = record.error->domain() == QuazorHostErrorDomain &&
-                          record.error->code() == static_cast<std::int64_t>(HostErrorCode::kNotRecorded);
-  return isOfRecord ? "record" : nameOf(Stage::kAnalyze);
+  const auto isHostError = [&record](HostErrorCode code) {
+    return record.error->domain() == QuazorHostErrorDomain && record.error->code() == static_cast<std::int64_t>(code);
+  };
+  if (isHostError(HostErrorCode::kNotRecorded)) return "record";
+  return isHostError(HostErrorCode::kInterrupted) ? std::string_view() : nameOf(Stage::kAnalyze);
 }
 
 void printResults(std::ostream& out, const DiagnosticRecord& record, ResultRows rows, bool colour) {
@@ -237,7 +239,7 @@ void printRecord(std::ostream& out, const DiagnosticRecord& record, bool colour)
     printResults(out, record, ResultRows::kAll, colour);
   }
   out << "\n  " << verdictText(record, colour) << '\n';
-  if (const std::string trial = trialText(record); !trial.empty()) out << "    " << trial << '\n';
+  if (const std::string trial = trialTextWithSeed(record); !trial.empty()) out << "    " << trial << '\n';
   if (record.verdict == Verdict::kError) out << errorText(record.error, "    ");
   if (record.skip) out << "    " << printable(textOf(*record.skip)) << '\n';
   out << '\n';

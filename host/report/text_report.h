@@ -26,7 +26,7 @@ std::string limitText(const std::optional<QZLimit>& limit);
 std::string errorText(const DiagnosticErrorPtr& error, std::string_view indent);
 
 // The stage of the record's error for tables: that of the analysis if its results cannot be judged, "record" if the
-// record could not be written; empty without an error.
+// record could not be written; empty without an error, or if it was interrupted at an unknown stage.
 std::string_view errorStageText(const DiagnosticRecord& record);
 
 // "PASS", "FAIL" or "ERROR"; "DONE" for an experiment on its own that returned a result.

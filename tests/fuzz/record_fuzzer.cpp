@@ -4,6 +4,7 @@
 #include "host/record/record_file.h"
 #include "host/record/run_event_json.h"
 #include "host/record/verification.h"
+#include "host/report/page/page.h"
 #include "host/report/record_difference.h"
 #include "host/report/report_format.h"
 #include "tests/fuzz/event_rules.h"
@@ -20,8 +21,10 @@ void requireReports(const std::filesystem::path& file) {
   const RecordedRun run = runIn(file);
   require(differencesOf(run, run).empty(), "a run does not differ from itself");
   const std::optional<std::string> interrupted = run.ended ? run.ended->interrupted : std::nullopt;
+  TextContent text;
+  text.page = [](const ShownRun& shown) { return reportPage({shown}, {}); };
   for (const Format format : kFormats) {
-    require(!reportText(format, run.began, run.records, interrupted).empty() || run.records.empty(),
+    require(!reportText(format, run.began, run.records, interrupted, text, run.streams).empty() || run.records.empty(),
             "a run can be reported in every format");
   }
 }

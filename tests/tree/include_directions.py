@@ -87,9 +87,11 @@ for name, below in {
     "model": ["device", "error", "limits", "plugin", "text"],
     "record": ["error", "limits", "model", "plugin", "system", "text"],
     "report": ["device", "error", "limits", "model", "plugin", "record", "system", "text"],
+    "report/page": ["limits", "model", "plugin", "record", "report", "text"],
     "run": ["device", "error", "limits", "model", "plugin", "record", "report", "system", "text"],
     "cli": ["device", "error", "limits", "plugin", "report", "run", "system", "text"],
-    "command": ["cli", "device", "error", "limits", "model", "plugin", "record", "report", "run", "system", "text"],
+    "command": ["cli", "device", "error", "limits", "model", "plugin", "record", "report", "report/page", "run",
+                "system", "text"],
 }.items():
     ALLOWED["host/" + name] = [*CONTRACT, "base/json", "base/text", *("host/" + folder for folder in below)]
 ALLOWED["host/device"] += BACKENDS

@@ -1,0 +1,19 @@
+// The frames of a diagnostic: their intervals, and how they go with those of the other streams.
+#pragma once
+
+#include "host/record/record_file.h"
+
+#include <string>
+#include <vector>
+
+namespace quazor {
+
+// A table of the streams, and for each a sentence and plots of the interval between its frames and of its offset
+// against the stream that began first. Without plots if `plots` is false. `level` is that of the headings. Empty
+// without frames.
+std::string framesSection(const std::vector<RecordedStream>& streams, int level, bool plots);
+
+// A sentence, a table and a plot of the intervals between the frames of two recordings of one stream.
+std::string comparedIntervals(const RecordedStream& before, const RecordedStream& after);
+
+}  // namespace quazor

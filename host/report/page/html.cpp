@@ -1,0 +1,68 @@
+#include "host/report/page/html.h"
+
+#include "host/text/display_width.h"
+#include "host/text/table.h"
+#include "host/text/xml_text.h"
+
+#include <charconv>
+
+namespace quazor {
+
+namespace {
+
+constexpr std::size_t kMaxNameWidth = 160;  // columns
+
+std::string digitsOf(double value, std::chars_format format, int precision) {
+  char digits[512];  // enough for the largest number
+  const auto [end, ignored] = std::to_chars(std::begin(digits), std::end(digits), value, format, precision);
+  return {digits, end};
+}
+
+}  // namespace
+
+std::string htmlText(std::string_view text) { return xmlAttribute(printable(text)); }
+
+std::string htmlLines(std::string_view text) { return xmlText(printableLines(text)); }
+
+std::string htmlProse(std::string_view text) {
+  std::string html;
+  while (true) {
+    const std::size_t begin = text.find('`');
+    const std::size_t end = begin == std::string_view::npos ? begin : text.find('`', begin + 1);
+    if (end == std::string_view::npos) return html + htmlText(text);
+    html += htmlText(text.substr(0, begin));
+    html += element("code", htmlText(text.substr(begin + 1, end - begin - 1)));
+    text.remove_prefix(end + 1);
+  }
+}
+
+std::string element(std::string_view tag, std::string_view content) {
+  std::string html = "<";
+  html += tag;
+  html += '>';
+  html += content;
+  html += "</";
+  html += tag.substr(0, tag.find(' '));
+  html += '>';
+  return html;
+}
+
+std::string htmlName(std::string_view name) { return xmlAttribute(shortened(printable(name), kMaxNameWidth)); }
+
+std::string wholeName(std::string_view name) {
+  const std::string shown = printable(name);
+  if (widthOf(shown) <= kMaxNameWidth) return {};
+  return element("p class=\"whole\"", "Whole name: " + xmlAttribute(shown));
+}
+
+std::string coordinate(double value) {
+  std::string text = digitsOf(value, std::chars_format::fixed, 1);
+  if (text.ends_with(".0")) text.erase(text.size() - 2);
+  return text == "-0" ? "0" : text;
+}
+
+std::string roundedText(double value) { return digitsOf(value, std::chars_format::general, 6); }
+
+std::string heading(int level, std::string_view content) { return element("h" + std::to_string(level), content); }
+
+}  // namespace quazor

@@ -1,0 +1,38 @@
+// Pieces of HTML. Texts of plug-ins, records and users reach a page through htmlText() or htmlLines() only.
+#pragma once
+
+#include <cstddef>
+#include <string>
+#include <string_view>
+
+namespace quazor {
+
+// Escapes a text for the content of an element and for an attribute in double quotes. Control characters, marks of
+// writing direction and bytes that are not UTF-8 are shown as \xNN, as in a terminal.
+std::string htmlText(std::string_view text);
+
+// The same for a text of several lines, which keeps its newlines and tabs.
+std::string htmlLines(std::string_view text);
+
+// Prose, in which `back quotes` enclose what is typed.
+std::string htmlProse(std::string_view text);
+
+// <tag>content</tag>. The tag may have attributes, as in "td class=\"value\"". `content` is HTML.
+std::string element(std::string_view tag, std::string_view content);
+
+// A phrase, in a heading or a cell, for a name of any length: a very long one is cut.
+std::string htmlName(std::string_view name);
+
+// The whole name in a paragraph of its own if htmlName() cuts it; else nothing.
+std::string wholeName(std::string_view name);
+
+// "1.5": with at most one decimal, for coordinates.
+std::string coordinate(double value);
+
+// A number with six significant digits, for what was calculated from results.
+std::string roundedText(double value);
+
+// A heading; level 1 is that of the page.
+std::string heading(int level, std::string_view content);
+
+}  // namespace quazor

@@ -1,0 +1,30 @@
+// A plot of values over time as SVG.
+#pragma once
+
+#include <string>
+#include <vector>
+
+namespace quazor {
+
+struct PlotPoint {
+  double x = 0;
+  double y = 0;
+};
+
+struct Plot {
+  std::string label;                // for those who do not see it
+  std::string unit;                 // of y; x is in seconds
+  std::vector<PlotPoint> points;    // finite, ascending in x
+  std::vector<double> marks{};      // x of what is marked
+  double median = 0;                // of y, shown by a line
+  std::vector<PlotPoint> others{};  // a second curve to compare with
+};
+
+// The size of the SVG is bounded: of many points, it has the minimum and the maximum of each of its columns. Empty for
+// fewer than two points.
+std::string plotSvg(const Plot& plot);
+
+// Samples without a time, as curves over each other; at most 2 of them. Those that are not finite are left out.
+std::string samplesSvg(const std::string& label, const std::vector<std::vector<double>>& curves);
+
+}  // namespace quazor
