@@ -78,6 +78,24 @@ class PageTest(unittest.TestCase):
         self.assertEqual(shown.records, written.records)
         self.assertEqual(len(shown.records), 5)
 
+    def sheets(self, text):
+        """The number of sheets of paper that the page takes."""
+        self.page.write_text(text)
+        file = self.directory / "page.pdf"
+        file.unlink(missing_ok=True)
+        self.browse(f"--print-to-pdf={file}", "--no-pdf-header-footer")
+        return len(re.findall(rb"/Type /Page\b", file.read_bytes()))
+
+    def test_closed_sections_are_printed(self):
+        self.make()
+        text = self.page.read_text()
+        self.assertIn("<details>", text)
+        closed = self.sheets(text)
+        self.assertEqual(closed, self.sheets(text.replace("<details>", "<details open>")))
+        # Without the rule of the style, and so without the policy, they are not: this test would see it.
+        without = re.sub("<meta http-equiv[^>]*>", "", text).replace("details::details-content{", "details::no-such-part{")
+        self.assertLess(self.sheets(without), closed)
+
     def test_it_loads_nothing(self):
         self.make()
         text = self.page.read_text()

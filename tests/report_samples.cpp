@@ -146,7 +146,11 @@ class Generator {
           AnalyzedRun{oneIn(4) ? "" : std::to_string(random_()), advance(), std::string(oneOf(kWords))};
     }
     sample.run.acceptFlaky = sample.run.attempts > 0 && oneIn(2);
-    for (std::size_t i = upTo(4); i > 0; --i) sample.run.names.push_back(name(i));
+    for (std::size_t i = upTo(4); i > 0; --i) {
+      const std::string one = name(i);
+      std::erase(sample.run.names, one);  // a run has each name once
+      sample.run.names.push_back(one);
+    }
     resultNames_ = {patternless(name(1001)), patternless(name(1002)), patternless(name(1003))};
     if (oneIn(2)) {
       for (std::size_t i = upTo(4); i > 0; --i) sample.run.limits.push_back(limit(sample.run.names));
@@ -156,7 +160,11 @@ class Generator {
     for (std::size_t round = 1; round <= rounds; ++round) {
       for (const std::string& name : sample.run.names) addAttempts(sample, name, round);
     }
-    if (oneIn(5)) interrupt(sample);
+    if (oneIn(5)) {
+      interrupt(sample);
+    } else if (!sample.run.ofExperiments) {
+      addLimitsWithoutResult(sample);
+    }
     return sample;
   }
 
@@ -171,6 +179,20 @@ class Generator {
       record.trial = {run.attempts == 0 ? 0 : attempt, run.attempts, run.repetitions == 0 ? 0 : round, run.repetitions};
       sample.records.push_back(std::move(record));
       if (sample.records.back().verdict != Verdict::kError || hasFailedResult(sample.records.back())) return;
+    }
+  }
+
+  // The entries of the limits that fit no result, at the end of the run.
+  void addLimitsWithoutResult(Sample& sample) {
+    const std::vector<DiagnosticRecord> measured = sample.records;
+    for (const UserLimit& limit : limitsWithoutResult(limits_, measured)) {
+      DiagnosticRecord record;
+      record.name = canonicalText(limit);
+      record.summary = "A limit that fits no result.";
+      record.begin = advance();
+      record.error = errorOfLimitWithoutResult(limit, measured);
+      record.errorStage = Stage::kAnalyze;
+      sample.records.push_back(ended(std::move(record), false));
     }
   }
 
@@ -235,7 +257,7 @@ class Generator {
     }
     const LimitOperator comparison = oneOf(kOperators);
     double tolerance = comparison == LimitOperator::kEqual && oneIn(2) ? std::abs(number()) : 0;
-    const bool isHuge = tolerance > 0 && oneIn(4);  // beyond it there is no bound
+    const bool isHuge = tolerance > 0 && oneIn(2);  // beyond it there is no bound
     if (isHuge) tolerance = std::numeric_limits<double>::max();
     if (oneIn(2)) return RelationCondition{comparison, resultNames_[upTo(2)], tolerance};
     return NumberCondition{comparison, isHuge ? tolerance : number(), tolerance, ofNumber};

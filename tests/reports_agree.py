@@ -32,6 +32,7 @@ SEED = 20261121
 SHOWN = 20
 FORMS = ("text", "json", "csv", "ocp", "junit", "html", "record")
 INTERRUPTION = report_readers.Error("QuazorHostErrorDomain", 11, "it was interrupted")
+LIMIT_WITHOUT_RESULT = ("QuazorHostErrorDomain", 14)
 SIGNS = ("]]>", "\ufffd", "\uffff", "\\u0000", "\\r", "\u2028", ",")  # as in JSON
 # The samples must contain some of each.
 KINDS = {"a diagnostic: pass", "a diagnostic: fail", "a diagnostic: error", "a diagnostic: skip", "an experiment: pass",
@@ -44,7 +45,8 @@ KINDS = {"a diagnostic: pass", "a diagnostic: fail", "a diagnostic: error", "a d
            for severity, verdicts in (("fail", ("pass", "fail", "error", "skip")), ("warn", ("pass", "warn", "skip")))
            for verdict in verdicts),
          "a record with bytes that are no text", "a tolerance", "a tolerance without a bound", "a unit",
-         "a limit on a value that is not finite", *(f"a text with {sign!r}" for sign in SIGNS)}
+         "a limit on a value that is not finite", "a limit without a result", "a run with attempts",
+         "a run that ended with a later attempt", "a warning in a run that passed", *(f"a text with {sign!r}" for sign in SIGNS)}
 
 
 def trial_text(record, run):
@@ -55,6 +57,8 @@ def trial_text(record, run):
     if record["attempt"] and (record["attempt"] > 1 or record["verdict"] == "error"):
         passed = "pass in " if record["verdict"] == "pass" else ""
         parts.append(f"{passed}attempt {record['attempt']} of {run['attempts']}")
+    if record["repetition"] and record["verdict"] in ("fail", "error"):
+        parts.append(f"seed {record['seed']}")
     return ", ".join(parts)
 
 
@@ -68,14 +72,22 @@ def outcome_of(record):
     return "flaky" if record["verdict"] == "pass" and (record["attempt"] or 1) > 1 else record["verdict"]
 
 
+def is_of_limit(record):
+    """True for the entry of a limit that fits no result, which is no diagnostic."""
+    return bool(record["errors"]) and record["errors"][0][:2] == LIMIT_WITHOUT_RESULT
+
+
 def counts_line(records, of_experiments, never_began):
-    ended = last_attempts(records)
+    limits = sum(map(is_of_limit, records))
+    ended = [one for one in last_attempts(records) if not is_of_limit(one)]
     count = collections.Counter(outcome_of(one) for one in ended)
     many = "" if len(ended) == 1 else "s"
     noun = "run" if any(one["repetition"] for one in records) else "experiment" if of_experiments else "diagnostic"
     more = "".join(f", {count[key]} {word}" for key, word in (("skip", "skipped"), ("flaky", "flaky")) if count[key])
     if never_began:
         more += f", {never_began} not reached"
+    if limits:
+        more += f", {limits} limit{'' if limits == 1 else 's'} without a result"
     if warnings := report_limits.warnings_in(records):
         more += f", {warnings} warning{'' if warnings == 1 else 's'}"
     if of_experiments:
@@ -281,6 +293,11 @@ class Comparison:
         found = [(one["name"], one["verdicts"]) for one in document.get("variation", [])]
         self.check(f"{name} json: variation", found, list(counts.items()))
         self.kinds["a run with repetitions"] += bool(counts)
+        self.kinds["a run with attempts"] += "attempts" in run
+        self.kinds["a run that ended with a later attempt"] += bool(records) and (records[-1]["attempt"] or 1) > 1
+        self.kinds["a limit without a result"] += any(map(is_of_limit, records))
+        self.kinds["a warning in a run that passed"] += (run_verdict(records, run.get("acceptFlaky")) == "pass" and
+                                                         report_limits.warnings_in(records) > 0)
         self.kinds["a flaky diagnostic"] += sum(outcome_of(one) == "flaky" for one in records)
         for one in document.get("variation", []):
             self.check_values(f"{name} json: variation of {one['name']}", one, records)
@@ -403,7 +420,7 @@ class Comparison:
             got = report_readers.read_text(lines, expected)
             self.check_record(f"{name} {place} text", blurred(got), blurred(expected))
         if any(one["repetition"] for one in records):
-            title = b"What varied between the repetitions" + b" (#: the first repetition with that value; Outlier: the one that differs most, and its seed)" * varies + b":"
+            title = b"What varied between the repetitions" + b" (#: the first repetition with that value; Outlier: the one whose rare value differs most, and its seed)" * varies + b":"
             self.check(f"{name} text: variation", lines.block()[0], title)
         left = [line.decode("utf-8", "replace") for line in lines.rest()]
         self.check(f"{name} text: end", blurred(left), blurred([*end, ""]))

@@ -14,6 +14,7 @@ void addReportCommandOptions(CLI::App& command, ReportCommandTexts& texts) {
                   "lines and frames, in the Trace Event Format that Perfetto, speedscope and Chrome open. Default html")
       ->type_name("FORMAT")
       ->check(CLI::IsMember({"html", "trace"}));
+  command.add_flag("--compare", texts.compare, "Make a page of what differs between two records");
   command.add_flag("--no-frames", texts.noFrames, "Leave the frames out of the page");
   command.add_option("--from", texts.from, "Leave out what ends before this time; 0 is the beginning of the run")
       ->type_name("SECONDS");
@@ -24,6 +25,7 @@ RecordReport recordReportOf(const ReportCommandTexts& texts, const std::vector<s
   RecordReport report;
   report.isTimeline = texts.format == "trace";
   report.frames = !texts.noFrames;
+  report.isComparison = texts.compare;
   if (!texts.from.empty()) report.part.from = parseTime("--from", texts.from);
   if (!texts.to.empty()) report.part.to = parseTime("--to", texts.to);
   if (report.part.to < report.part.from) {
@@ -35,8 +37,11 @@ RecordReport recordReportOf(const ReportCommandTexts& texts, const std::vector<s
   if (report.isTimeline) {
     require(records.size() <= 1,
             "--format trace: a time line is of one record, but there are " + std::to_string(records.size()));
+    require(!report.isComparison, "--compare applies only to --format html");
     require(report.frames, "--no-frames applies only to --format html");
   } else {
+    require(!report.isComparison || records.size() == 2,
+            "--compare takes two records, but there are " + std::to_string(records.size()));
     require(texts.from.empty(), "--from applies only to --format trace");
     require(texts.to.empty(), "--to applies only to --format trace");
   }

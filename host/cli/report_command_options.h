@@ -20,13 +20,15 @@ struct ReportCommandTexts {
   std::string from;
   std::string to;
   bool noFrames = false;
+  bool compare = false;
 };
 
 // What the command makes of records.
 struct RecordReport {
-  bool isTimeline = false;  // else a page
-  TimelinePart part;        // of a time line
-  bool frames = true;       // show them on a page
+  bool isTimeline = false;    // else a page
+  TimelinePart part;          // of a time line
+  bool frames = true;         // show them on a page
+  bool isComparison = false;  // a page of what differs between two records
 };
 
 void addReportCommandOptions(CLI::App& command, ReportCommandTexts& texts);

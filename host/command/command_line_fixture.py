@@ -38,8 +38,8 @@ def quazor(*arguments, **options):
     environment = {key: value for key, value in os.environ.items() if key not in ("NO_COLOR", "TERM")}
     environment.update(options.pop("env", {}))
     options.setdefault("stdout", subprocess.PIPE)
-    return subprocess.run([PROGRAM, *map(str, arguments)], stderr=subprocess.PIPE, text=True, timeout=120,
-                          env=environment, **options)
+    options.setdefault("timeout", 120)
+    return subprocess.run([PROGRAM, *map(str, arguments)], stderr=subprocess.PIPE, text=True, env=environment, **options)
 
 
 def start(*arguments, ignored=False, **options):

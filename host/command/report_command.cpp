@@ -7,6 +7,7 @@
 #include "host/model/incomplete_run.h"
 #include "host/record/record_file.h"
 #include "host/record/record_place.h"
+#include "host/report/page/comparison.h"
 #include "host/report/page/page.h"
 #include "host/report/timeline.h"
 #include "host/text/table.h"
@@ -58,6 +59,14 @@ PageOptions pageOptions(const Installation& installation) {
   return options;
 }
 
+void writeComparison(const Options& options, Console& console) {
+  const RecordedRun before = runIn(options.records[0]);
+  const RecordedRun after = runIn(options.records[1]);
+  writeOutput(options.report, console,
+              comparisonPage({before, options.records[0].string()}, {after, options.records[1].string()},
+                             options.ofRecords.frames));
+}
+
 void writePage(const Options& options, const Installation& installation, Console& console) {
   const std::vector<std::filesystem::path> files = recordsIn(options.records);
   std::vector<RecordedRun> runs;
@@ -83,6 +92,8 @@ std::function<std::string(const ShownRun& run)> pageWriter(const Installation& i
 ExitCode reportCommand(const Options& options, const Installation& installation, Console& console) {
   if (options.ofRecords.isTimeline) {
     writeTimeline(options, console);
+  } else if (options.ofRecords.isComparison) {
+    writeComparison(options, console);
   } else {
     writePage(options, installation, console);
   }

@@ -139,6 +139,20 @@ class PageTest(RecordTest):
         self.run_all()
         self.assertNotIn("Stream front-infrared", self.page(self.record, "--no-frames"))
 
+    def test_two_records_compared(self):
+        self.run_all()
+        other = self.directory / "other.jsonl"
+        result = quazor("run", "--all", "--record", other, "--phone", "camera_sync/frames_dropped")
+        self.assertEqual(result.returncode, 0, result.stderr)
+        page = self.page(self.record, other, "--compare")
+        differences = quazor("diff", self.record, other).stdout.splitlines()
+        self.assertGreater(len(differences), 5)
+        self.assertIn(f"The records differ in {len(differences)} places", page)
+        self.assertIn("TesselFaultDiagnostic: stream front-infrared", page)
+        self.assertIn('class="curve1"', page)
+        self.assertNotIn("<svg", self.page(self.record, other, "--compare", "--no-frames"))
+        self.assertIn("The records do not differ", self.page(self.record, self.record, "--compare"))
+
     def test_a_folder_of_records(self):
         self.run_all()
         (self.directory / "other.jsonl").write_bytes(self.record.read_bytes())
@@ -165,6 +179,9 @@ class PageTest(RecordTest):
         noise.write_text("no record\n")
         for arguments, code, text in [
                 (["report", noise], 66, "noise"),
+                (["report", self.record, "--compare"], 64, "--compare takes two records, but there are 1"),
+                (["report", self.record, noise, "--compare"], 66, "noise"),
+                (["report", self.record, self.directory, "--compare"], 66, "folder"),
                 (["report", self.record, noise], 66, "noise"),
                 (["report", self.directory / "missing"], 66, "missing"),
                 (["report", self.record, "--output", self.record], 73, "is a record"),

@@ -248,5 +248,77 @@ TEST(ExitCodeProperty, MoreLimitsNeverImproveARun) {
   EXPECT_GT(changed, kRuns / 10);
 }
 
+// The entries of a run, with those of the limits that fit no result, as the host adds them.
+std::vector<DiagnosticRecord> withLimitsWithoutResult(std::vector<DiagnosticRecord> records,
+                                                      const std::vector<UserLimit>& limits) {
+  const std::vector<DiagnosticRecord> measured = records;
+  for (const UserLimit& limit : limitsWithoutResult(limits, measured)) {
+    DiagnosticRecord record;
+    record.name = canonicalText(limit);
+    record.error = errorOfLimitWithoutResult(limit, measured);
+    record.verdict = judgeRecord(record, false).verdict;
+    records.push_back(std::move(record));
+  }
+  return records;
+}
+
+// A limit on "Count", the only result, or on one that does not exist, of diagnostics of which some do not exist.
+UserLimit anyLimit(RandomValues& random) {
+  const std::string diagnostic[] = {"", "0:", "1:", "*:", "2:"};
+  const std::string result[] = {"Count", "C*", "Cuont", "Total*"};
+  const std::string condition = random.chance(90) ? " <= 1000" : " <= 0";
+  UserLimit limit =
+      limitOf(diagnostic[random.below(std::size(diagnostic))] + result[random.below(std::size(result))] + condition,
+              random.chance(70) ? LimitSeverity::kFail : LimitSeverity::kWarn);
+  limit.onlyIfSelected = random.chance(30);
+  return limit;
+}
+
+// True if the limit is meant for a diagnostic that passed or was judged, and none has the result. Not in a run with
+// diagnostics that were not reached: that run has a failure or an error already.
+bool isForNothing(const UserLimit& limit, const std::vector<Word>& words) {
+  if (limit.result == "Count" || limit.result == "C*") return false;
+  if (std::any_of(words.begin(), words.end(), [](const Word& word) { return word.letters == "r"; })) return false;
+  const auto isMeant = [&limit](const Word& word) {
+    return limit.diagnostic.empty() || limit.diagnostic == "*" || limit.diagnostic == std::to_string(word.diagnostic);
+  };
+  return std::any_of(words.begin(), words.end(),
+                     [&](const Word& word) { return isMeant(word) && outcomesOf(word).back() == 'p'; });
+}
+
+// A limit that protects nothing makes a run an error, whatever its severity, and no limit makes it better.
+TEST(ExitCodeProperty, LimitsThatFitNoResultNeverImproveARun) {
+  constexpr int kRuns = 5'000;
+  RandomValues random(11);
+  int spoilt = 0;
+  int passed = 0;
+  for (int i = 0; i < kRuns; ++i) {
+    const std::vector<Word> words = {{possibleWord(random), 0, 1}, {possibleWord(random), 1, 1}};
+    const ExitRules rules{random.chance(50), random.chance(50)};
+    std::vector<DiagnosticRecord> records = recordsOf(words);
+    const ExitCode before = exitCodeOf(records, rules);
+    std::vector<UserLimit> limits;
+    for (std::uint64_t more = 1 + random.below(3); more > 0; --more) limits.push_back(anyLimit(random));
+    for (DiagnosticRecord& record : records) {
+      if (record.verdict == Verdict::kError || record.skip) continue;
+      for (const UserLimit& limit : limitsFor(record.name, limits)) record.limits.push_back(limit);
+      const RecordJudgement judgement = judgeRecord(record, true);
+      record.verdict = judgement.verdict;
+      record.error = judgement.error;
+    }
+    const ExitCode after = exitCodeOf(withLimitsWithoutResult(std::move(records), limits), rules);
+    ASSERT_FALSE(before != ExitCode::kAllPassed && after == ExitCode::kAllPassed) << i;
+    const bool hasOneForNothing = std::any_of(limits.begin(), limits.end(),
+                                              [&words](const UserLimit& limit) { return isForNothing(limit, words); });
+    if (hasOneForNothing) {
+      ASSERT_EQ(after, ExitCode::kError) << i << ' ' << words[0].letters << ' ' << words[1].letters;
+    }
+    spoilt += before == ExitCode::kAllPassed && hasOneForNothing ? 1 : 0;
+    passed += after == ExitCode::kAllPassed ? 1 : 0;
+  }
+  EXPECT_GT(spoilt, kRuns / 20);
+  EXPECT_GT(passed, kRuns / 20);
+}
+
 }  // namespace
 }  // namespace quazor

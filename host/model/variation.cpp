@@ -73,29 +73,41 @@ bool varies(const Series& series) {
                      [&series](const RepeatedValue& one) { return !isSame(one.value, series.values.front().value); });
 }
 
-// The most frequent value, the first one of several, if at least half of the values are that.
-std::optional<double> frequentValueOf(const std::vector<RepeatedValue>& values) {
-  const auto isLess = [](double one, double other) {  // a value that is not a number is greatest
-    return std::isnan(one) || std::isnan(other) ? !std::isnan(one) : one < other;
-  };
-  std::map<double, std::size_t, decltype(isLess)> counts(isLess);
-  std::size_t most = 0;
-  for (const RepeatedValue& one : values) most = std::max(most, ++counts[one.value]);
-  if (most * 2 < values.size()) return std::nullopt;
-  return std::find_if(values.begin(), values.end(), [&](const RepeatedValue& one) { return counts[one.value] == most; })
-      ->value;
+bool isLess(double one, double other) {  // a value that is not a number is greatest
+  return std::isnan(one) || std::isnan(other) ? !std::isnan(one) : one < other;
 }
 
-const RepeatedValue& outlierOf(const std::vector<RepeatedValue>& values, double median) {
-  const double usual = frequentValueOf(values).value_or(median);
+// How often each value occurs.
+using Counts = std::map<double, std::size_t, decltype(&isLess)>;
+
+Counts countsOf(const std::vector<RepeatedValue>& values) {
+  Counts counts(&isLess);
+  for (const RepeatedValue& one : values) ++counts[one.value];
+  return counts;
+}
+
+// The most frequent value, the first one of several, if at least half of the values are that.
+std::optional<double> frequentValueOf(const std::vector<RepeatedValue>& values, const Counts& counts) {
+  const auto found = std::find_if(values.begin(), values.end(),
+                                  [&](const RepeatedValue& one) { return counts.at(one.value) * 2 >= values.size(); });
+  return found == values.end() ? std::nullopt : std::optional(found->value);
+}
+
+// Null if no value is rare.
+const RepeatedValue* outlierOf(const std::vector<RepeatedValue>& values, double median) {
+  const Counts counts = countsOf(values);
+  const double usual = frequentValueOf(values, counts).value_or(median);
   const auto distanceOf = [usual](const RepeatedValue& one) {
     if (isSame(one.value, usual)) return 0.0;
     return std::isfinite(one.value) && std::isfinite(usual) ? std::abs(one.value / 2 - usual / 2)  // cannot overflow
                                                             : std::numeric_limits<double>::infinity();
   };
-  return *std::max_element(values.begin(), values.end(), [&](const RepeatedValue& one, const RepeatedValue& other) {
-    return distanceOf(one) < distanceOf(other);
-  });
+  const RepeatedValue* outlier = nullptr;
+  for (const RepeatedValue& one : values) {
+    const bool isRare = counts.at(one.value) * 4 <= values.size();
+    if (isRare && (outlier == nullptr || distanceOf(one) > distanceOf(*outlier))) outlier = &one;
+  }
+  return outlier;
 }
 
 // Of the finite values; there may be none.
@@ -123,9 +135,10 @@ VaryingResult summaryOf(const Series& series) {
   VaryingResult result{series.name, series.unit,  series.values.size(), kNone, kNone, kNone, 0, 0, 0,
                        0,           series.limit, series.userLimits};
   summarizeFinite(series.values, result);
-  const RepeatedValue& outlier = outlierOf(series.values, result.median);
-  result.outlierRepetition = outlier.repetition;
-  result.outlierSeed = outlier.seed;
+  if (const RepeatedValue* const outlier = outlierOf(series.values, result.median)) {
+    result.outlierRepetition = outlier->repetition;
+    result.outlierSeed = outlier->seed;
+  }
   return result;
 }
 

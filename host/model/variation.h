@@ -38,8 +38,9 @@ struct VaryingResult {
   double maximum = 0;
   std::uint64_t minimumRepetition = 0;  // the first with that value
   std::uint64_t maximumRepetition = 0;
-  // The first repetition whose value is farthest from the usual one: from the most frequent value if half of all are
-  // that, otherwise from the median. A value that is not finite is farther than any that is.
+  // Of the values that at most a quarter of all are, the first repetition with the one that is farthest from the usual
+  // one: from the most frequent value if half of all are that, otherwise from the median. A value that is not finite is
+  // farther than any that is. 0 if every value is more frequent.
   std::uint64_t outlierRepetition = 0;
   std::uint64_t outlierSeed = 0;
   std::optional<QZLimit> limit;       // the first that it had

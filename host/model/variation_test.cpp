@@ -74,24 +74,27 @@ TEST(Variation, HasTheFirstRepetitionsOfMinimumAndMaximum) {
   EXPECT_EQ(varyingOf({std::nan(""), HUGE_VAL}).minimumRepetition, 0U);
 }
 
-TEST(Variation, HasTheFirstRepetitionThatIsFarthestFromTheUsualValue) {
+TEST(Variation, HasTheFirstRepetitionWhoseRareValueIsFarthestFromTheUsualOne) {
   const double nan = std::nan("");
   constexpr double kMost = std::numeric_limits<double>::max();
   const std::pair<std::vector<double>, std::uint64_t> cases[] = {
-      {{90, 90, 87, 90}, 3},      // from the most frequent value
-      {{90, 90, 87, 70, 87}, 4},  // from the median
-      {{10, 1}, 2},               // of two values, the first is the usual one
-      {{2, 1, 9, 9}, 2},          // half of the values are enough
+      {{90, 90, 87, 90}, 3},          // from the most frequent value
+      {{90, 90, 87, 70, 87}, 4},      // from the median
+      {{2, 1, 9, 9}, 2},              // half of the values are enough
+      {{90, 87, 90, 87, 90, 89}, 6},  // the farthest is not rare
+      {{90, 87, 90, 87}, 0},          // none is rare
+      {{10, 1}, 0},                   // each is half of all
+      {{90, 80, 90}, 0},              // more than a quarter
       {{1.5, 1.6, 1.4, 1.9}, 4},
       {{5, 5, 4, 6}, 3},  // the first of two
       {{1, 2, nan, 50, HUGE_VAL}, 3},
-      {{nan, nan, 7}, 3},
-      {{-kMost, kMost, kMost / 2}, 1}};
+      {{nan, nan, nan, 7}, 4},
+      {{-kMost, kMost, kMost / 2, kMost / 4}, 1}};
   for (const auto& [values, repetition] : cases) {
     SCOPED_TRACE(testing::PrintToString(values));
     const VaryingResult some = varyingOf(values);
     EXPECT_EQ(some.outlierRepetition, repetition);
-    EXPECT_EQ(some.outlierSeed, 100 + repetition);
+    EXPECT_EQ(some.outlierSeed, repetition == 0 ? 0 : 100 + repetition);
   }
 }
 

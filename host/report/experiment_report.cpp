@@ -144,7 +144,7 @@ void printExperiment(std::ostream& out, const DiagnosticRecord& record, TextStyl
     printAuxiliaryData(out, record.auxiliaryData, style.blocks);
   }
   out << "\n  " << verdictText(record, style.colour) << '\n';
-  if (const std::string trial = trialText(record); !trial.empty()) out << "    " << trial << '\n';
+  if (const std::string trial = trialTextWithSeed(record); !trial.empty()) out << "    " << trial << '\n';
   if (record.verdict == Verdict::kError) out << errorText(record.error, "    ");
   if (record.skip) out << "    " << printable(textOf(*record.skip)) << '\n';
   out << '\n';

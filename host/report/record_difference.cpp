@@ -6,6 +6,7 @@
 #include "host/report/text_report.h"
 
 #include <algorithm>
+#include <optional>
 #include <string_view>
 #include <utility>
 
@@ -67,17 +68,14 @@ OrderedMap<Facts> factsOf(const RecordedRun& run) {
   return facts;
 }
 
-void compare(const std::string& name, const Facts& before, const Facts& after, std::vector<std::string>& differences) {
+void compare(const std::string& name, const Facts& before, const Facts& after, std::vector<Difference>& differences) {
   for (const auto& [what, fact] : before) {
     const std::string* const other = after.find(what);
     if (other != nullptr && *other == fact) continue;
-    differences.push_back(other == nullptr ? formatMessage("%@: %@ is only in the first: %@", name, what, fact)
-                                           : formatMessage("%@: %@ was %@ and is %@", name, what, fact, *other));
+    differences.push_back({name, what, fact, other == nullptr ? std::nullopt : std::optional(*other)});
   }
   for (const auto& [what, fact] : after) {
-    if (!before.contains(what)) {
-      differences.push_back(formatMessage("%@: %@ is only in the second: %@", name, what, fact));
-    }
+    if (!before.contains(what)) differences.push_back({name, what, std::nullopt, fact});
   }
 }
 
@@ -93,38 +91,39 @@ const RecordedStream* streamNamed(const std::vector<RecordedStream>& streams, co
   return found == streams.end() ? nullptr : &*found;
 }
 
-// The sentence about the first frame that differs; empty if none does. `subject` names diagnostic and stream.
-std::string frameDifference(const std::string& subject, const std::vector<TracedFrame>& before,
-                            const std::vector<TracedFrame>& after) {
-  const auto [one, other] = std::mismatch(before.begin(), before.end(), after.begin(), after.end());
-  if (one == before.end() && other == after.end()) return {};
-  const std::string begin = formatMessage("%@: frame %@, the first that differs,", subject, one - before.begin() + 1);
-  if (other == after.end()) return formatMessage("%@ is only in the first: %@", begin, textOf(*one));
-  if (one == before.end()) return formatMessage("%@ is only in the second: %@", begin, textOf(*other));
-  return formatMessage("%@ was %@ and is %@", begin, textOf(*one), textOf(*other));
+// Adds the first frame that differs.
+void compareFrames(const std::string& name, const RecordedStream& before, const RecordedStream& after,
+                   std::vector<Difference>& differences) {
+  const auto [one, other] =
+      std::mismatch(before.frames.begin(), before.frames.end(), after.frames.begin(), after.frames.end());
+  const bool isInFirst = one != before.frames.end();
+  const bool isInSecond = other != after.frames.end();
+  if (!isInFirst && !isInSecond) return;
+  differences.push_back(
+      {name,
+       formatMessage("stream %@: frame %@, the first that differs,", before.name, one - before.frames.begin() + 1),
+       isInFirst ? std::optional(textOf(*one)) : std::nullopt,
+       isInSecond ? std::optional(textOf(*other)) : std::nullopt});
 }
 
 void compareStreams(const std::string& name, const std::vector<RecordedStream>& before,
-                    const std::vector<RecordedStream>& after, std::vector<std::string>& differences) {
-  const auto subjectOf = [&name](const RecordedStream& stream) {
-    return formatMessage("%@: stream %@", name, stream.name);
-  };
+                    const std::vector<RecordedStream>& after, std::vector<Difference>& differences) {
   for (const RecordedStream& stream : before) {
     const RecordedStream* const other = streamNamed(after, stream.name);
     if (other == nullptr) {
-      differences.push_back(subjectOf(stream) + " is only in the first");
+      differences.push_back({name, "stream " + stream.name, "", std::nullopt});
       continue;
     }
-    std::string difference = frameDifference(subjectOf(stream), stream.frames, other->frames);
-    if (!difference.empty()) differences.push_back(std::move(difference));
+    compareFrames(name, stream, *other, differences);
     if (stream.lost != other->lost) {
-      differences.push_back(
-          formatMessage("%@: the number of lost frames was %@ and is %@", subjectOf(stream), stream.lost, other->lost));
+      differences.push_back({name, formatMessage("stream %@: the number of lost frames", stream.name),
+                             std::to_string(stream.lost), std::to_string(other->lost)});
     }
   }
   for (const RecordedStream& stream : after) {
-    if (streamNamed(before, stream.name) == nullptr)
-      differences.push_back(subjectOf(stream) + " is only in the second");
+    if (streamNamed(before, stream.name) == nullptr) {
+      differences.push_back({name, "stream " + stream.name, std::nullopt, ""});
+    }
   }
 }
 
@@ -154,14 +153,14 @@ class ComparedRun {
 
 }  // namespace
 
-std::vector<std::string> differencesOf(const RecordedRun& before, const RecordedRun& after) {
-  std::vector<std::string> differences;
+std::vector<Difference> listedDifferences(const RecordedRun& before, const RecordedRun& after) {
+  std::vector<Difference> differences;
   const ComparedRun first(before);
   const ComparedRun second(after);
   for (const auto& [name, facts] : first.facts) {
     const Facts* const others = second.facts.find(name);
     if (others == nullptr) {
-      differences.push_back(name + " is only in the first");
+      differences.push_back({name, "", "", std::nullopt});
       continue;
     }
     compare(name, facts, *others, differences);
@@ -170,9 +169,25 @@ std::vector<std::string> differencesOf(const RecordedRun& before, const Recorded
     if (streams != nullptr && otherStreams != nullptr) compareStreams(name, *streams, *otherStreams, differences);
   }
   for (const auto& [name, facts] : second.facts) {
-    if (!first.facts.contains(name)) differences.push_back(name + " is only in the second");
+    if (!first.facts.contains(name)) differences.push_back({name, "", std::nullopt, ""});
   }
   return differences;
+}
+
+std::string sentenceOf(const Difference& difference) {
+  const std::string subject = difference.name + (difference.what.empty() ? "" : ": " + difference.what);
+  if (difference.before && difference.after) {
+    return formatMessage("%@ was %@ and is %@", subject, *difference.before, *difference.after);
+  }
+  const std::string& value = difference.before ? *difference.before : *difference.after;
+  return formatMessage("%@ is only in the %@%@", subject, difference.before ? "first" : "second",
+                       value.empty() ? value : ": " + value);
+}
+
+std::vector<std::string> differencesOf(const RecordedRun& before, const RecordedRun& after) {
+  std::vector<std::string> sentences;
+  for (const Difference& one : listedDifferences(before, after)) sentences.push_back(sentenceOf(one));
+  return sentences;
 }
 
 }  // namespace quazor

@@ -77,7 +77,7 @@ struct FailureLine {
 
 FailureLine lineOf(const std::vector<DiagnosticRecord>& records, std::size_t index, bool colour) {
   const DiagnosticRecord& record = records[index];
-  FailureLine line{{}, trialText(record), record.trial.repetition > 0};
+  FailureLine line{{}, trialTextWithSeed(record), record.trial.repetition > 0};
   if (isFlaky(record) && record.verdict == Verdict::kPass) {
     line.text = flakyColumn(colour) + printable(record.name);
     const DiagnosticErrorPtr before = index == 0 ? nullptr : records[index - 1].error;  // of the attempt before
@@ -142,7 +142,7 @@ std::string resultCountsText(const DiagnosticRecord& record) {
 
 void printShortRecord(std::ostream& out, const DiagnosticRecord& record, bool colour, std::size_t nameWidth) {
   const std::string more = record.skip ? printable(textOf(*record.skip)) : resultCountsText(record);
-  const std::string trial = trialText(record);
+  const std::string trial = trialTextWithSeed(record);
   printVerdict(out, record, colour, trial + (trial.empty() || more.empty() ? "" : ", ") + more, nameWidth);
   if (record.skip) return;
   const bool passed = record.verdict == Verdict::kPass;

@@ -239,7 +239,7 @@ void printRecord(std::ostream& out, const DiagnosticRecord& record, bool colour)
     printResults(out, record, ResultRows::kAll, colour);
   }
   out << "\n  " << verdictText(record, colour) << '\n';
-  if (const std::string trial = trialText(record); !trial.empty()) out << "    " << trial << '\n';
+  if (const std::string trial = trialTextWithSeed(record); !trial.empty()) out << "    " << trial << '\n';
   if (record.verdict == Verdict::kError) out << errorText(record.error, "    ");
   if (record.skip) out << "    " << printable(textOf(*record.skip)) << '\n';
   out << '\n';

@@ -60,8 +60,8 @@ void printVarying(std::ostream& out, const std::vector<VaryingResult>& results) 
     const auto addRow = [&table, &one](const std::string& limit) {
       table.addRow({printable(one.name), std::to_string(one.values), defaultText(one.minimum),
                     repetitionText(one.minimumRepetition), defaultText(one.median), defaultText(one.maximum),
-                    repetitionText(one.maximumRepetition), std::to_string(one.outlierRepetition),
-                    std::to_string(one.outlierSeed), printable(one.unit), limit});
+                    repetitionText(one.maximumRepetition), repetitionText(one.outlierRepetition),
+                    one.outlierRepetition == 0 ? "-" : std::to_string(one.outlierSeed), printable(one.unit), limit});
     };
     addRow(limitText(one.limit));
     for (const UserLimit& limit : one.userLimits) addRow(printable(labelOf(limit)));
@@ -79,6 +79,12 @@ std::string trialText(const DiagnosticRecord& record) {
   if (attempt == 0 || (attempt == 1 && record.verdict != Verdict::kError)) return text;
   if (!text.empty()) text += ", ";
   return text + (passed ? "pass in " : "") + numberOf("attempt", attempt, attempts);
+}
+
+std::string trialTextWithSeed(const DiagnosticRecord& record) {
+  const std::string text = trialText(record);
+  const bool isNoted = record.verdict == Verdict::kFail || record.verdict == Verdict::kError;
+  return record.trial.repetition > 0 && isNoted ? formatMessage("%@, seed %@", text, record.seed) : text;
 }
 
 bool isOnlyCounted(const DiagnosticRecord& record) {
@@ -104,8 +110,8 @@ void printVariation(std::ostream& out, const std::vector<DiagnosticRecord>& reco
   const bool isAnyVarying = std::any_of(variations.begin(), variations.end(),
                                         [](const DiagnosticVariation& one) { return !one.varying.empty(); });
   out << "What varied between the repetitions"
-      << (isAnyVarying ? " (#: the first repetition with that value; Outlier: the one that differs most, "
-                         "and its seed):\n"
+      << (isAnyVarying ? " (#: the first repetition with that value; Outlier: the one whose rare "
+                         "value differs most, and its seed):\n"
                        : ":\n");
   for (const DiagnosticVariation& one : variations) {
     out << printable(one.name) << ": " << countsText(one.verdicts, ofExperiments) << '\n';
@@ -132,8 +138,8 @@ Json variationJson(const std::vector<DiagnosticRecord>& records) {
                          {"maximum", numberJson(result.maximum)},
                          {"minimumRepetition", repetitionJson(result.minimumRepetition)},
                          {"maximumRepetition", repetitionJson(result.maximumRepetition)},
-                         {"outlierRepetition", result.outlierRepetition},
-                         {"outlierSeed", result.outlierSeed},
+                         {"outlierRepetition", repetitionJson(result.outlierRepetition)},
+                         {"outlierSeed", result.outlierRepetition == 0 ? Json() : Json(result.outlierSeed)},
                          {"limit", limitJson(result.limit)}});
       for (const UserLimit& limit : result.userLimits) varying.back()["userLimits"].push_back(userLimitJson(limit));
     }

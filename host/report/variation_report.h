@@ -15,6 +15,8 @@ namespace quazor {
 // "repetition 4 of 10, pass in attempt 2 of 3". Empty without these options. The first attempt is only told if it ended
 // in an error.
 std::string trialText(const DiagnosticRecord& record);
+// The same, with the seed of a repetition that failed or ended in an error, by which it can be run alone.
+std::string trialTextWithSeed(const DiagnosticRecord& record);
 
 // True for a record that a text report only counts unless it is verbose: of a repetition of a diagnostic that passed at
 // once and without a warning, or was skipped.

@@ -9,6 +9,7 @@
 #include <cmath>
 #include <cstddef>
 #include <cstdint>
+#include <iterator>
 #include <optional>
 
 namespace quazor {
@@ -227,6 +228,38 @@ std::string framesSection(const std::vector<RecordedStream>& streams, int level,
          "</th><th scope=\"col\">Capture to delivery</th><th scope=\"col\">Delivery to "
          "return</th></tr></thead><tbody>" +
          rows + "</tbody></table>\n" + details;
+}
+
+std::string comparedIntervals(const RecordedStream& before, const RecordedStream& after) {
+  const StreamFacts facts[] = {factsOf(before, before), factsOf(after, after)};
+  std::string rows;
+  std::string sentence;
+  for (std::size_t i = 0; i < std::size(facts); ++i) {
+    const RecordedStream& stream = i == 0 ? before : after;
+    const std::string name = i == 0 ? "First" : "Second";
+    rows += element("tr", element("th scope=\"row\"", name) +
+                              element("td class=\"number\"", std::to_string(stream.frames.size())) +
+                              element("td class=\"number\"", std::to_string(facts[i].missing)) +
+                              element("td", spreadText(facts[i].interval)));
+    sentence += name + ": " + countText(stream.frames.size(), "frame") + "." + gapSentence(stream, facts[i]) + " ";
+  }
+  const double median = facts[0].interval ? facts[0].interval->median : 0;
+  const std::string svg = plotSvg({"Intervals between the frames of " + before.name + " in both runs",
+                                   "ms",
+                                   facts[0].intervals,
+                                   {},
+                                   median,
+                                   facts[1].intervals});
+  return element("p", htmlText(sentence)) +
+         "<table><caption>Frames of both runs; interval in ms: median (minimum to maximum)</caption><thead><tr>"
+         "<th scope=\"col\">Run</th><th scope=\"col\">Frames</th><th scope=\"col\">Missing</th>"
+         "<th scope=\"col\">Interval</th></tr></thead>" +
+         element("tbody", rows) + "</table>" +
+         (svg.empty() ? svg
+                      : element("figure", element("figcaption",
+                                                  "Interval between frames, in ms: <span class=\"first\">"
+                                                  "first run</span>, <span class=\"second\">second run</span>") +
+                                              svg));
 }
 
 }  // namespace quazor

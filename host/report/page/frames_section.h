@@ -13,4 +13,7 @@ namespace quazor {
 // without frames.
 std::string framesSection(const std::vector<RecordedStream>& streams, int level, bool plots);
 
+// A sentence, a table and a plot of the intervals between the frames of two recordings of one stream.
+std::string comparedIntervals(const RecordedStream& before, const RecordedStream& after);
+
 }  // namespace quazor

@@ -1,60 +1,27 @@
 #include "host/report/page/page.h"
 
-#include "base/text/base64.h"
-#include "base/text/sha256.h"
 #include "contract/message_format.h"
 #include "host/model/trials.h"
+#include "host/report/page/document.h"
 #include "host/report/page/html.h"
 #include "host/report/page/results_table.h"
+#include "host/report/page/run_facts.h"
 #include "host/report/page/run_section.h"
-#include "host/report/page/style.h"
 #include "host/text/table.h"
-#include "host/text/timestamp.h"
 
 #include <algorithm>
 #include <cstddef>
-#include <filesystem>
 
 namespace quazor {
 
 namespace {
 
-// The head of the page: what counts, before everything else.
-std::string bannerOf(const PageVerdict& verdict, const std::string& sentence, const std::string& facts) {
-  return "<header class=\"" + verdict.kind + "\"><div>" +
-         element("h1", element("span class=\"word\"", verdict.word) + sentence) + element("p", facts) +
-         "</div></header>\n";
-}
-
-std::string shortPhone(const RunStarted& run) { return std::filesystem::path(run.phone).stem().string(); }
-
 std::string factsOf(const RunStarted& run) {
   std::string facts = "Phone " + htmlName(shortPhone(run));
   for (const auto& [key, value] : run.tags) facts += " \xC2\xB7 " + htmlName(key) + " " + htmlName(value);
-  facts += " \xC2\xB7 " + timestampText(run.date).substr(0, 19).replace(10, 1, " ") + " UTC";
+  facts += " \xC2\xB7 " + dateText(run.date) + " UTC";
   if (!run.host.empty()) facts += " \xC2\xB7 machine " + htmlName(run.host);
   return facts;
-}
-
-std::string policy() {
-  return "default-src 'none'; style-src 'sha256-" + base64(sha256(pageStyle())) +
-         "'; base-uri 'none'; form-action 'none'";
-}
-
-std::string document(const std::string& title, const std::string& body) {
-  return "<!DOCTYPE html>\n<html lang=\"en\">\n<head>\n<meta charset=\"utf-8\">\n"
-         "<meta http-equiv=\"Content-Security-Policy\" content=\"" +
-         policy() +
-         "\">\n<meta name=\"viewport\" content=\"width=device-width, initial-scale=1\">\n"
-         "<meta name=\"color-scheme\" content=\"light dark\">\n" +
-         element("title", title) + "\n" + element("style", pageStyle()) + "\n</head>\n<body>\n" + body +
-         "</body>\n</html>\n";
-}
-
-std::string footerOf(const ShownRun& run) {
-  return element("footer", element("p", "Made by quazor " + htmlText(run.began.program) +
-                                            ". This file is complete: it loads nothing and runs no script.")) +
-         "\n";
 }
 
 // The table of a page with several runs.
@@ -70,11 +37,11 @@ std::string runsTable(const std::vector<ShownRun>& runs) {
                                                           std::to_string(i + 1) + "</a>") +
                               element("td", verdictBadge(verdict.kind)) + element("td", htmlText(summaryOf(runs[i]))) +
                               element("td", htmlName(shortPhone(run))) + element("td", tags) +
-                              element("td", timestampText(run.date).substr(0, 19).replace(10, 1, " ")) +
-                              element("td", htmlName(run.host)) + element("td", htmlText(runs[i].file))) +
+                              element("td", dateText(run.date)) + element("td", htmlName(run.host)) +
+                              element("td", htmlText(runs[i].file))) +
             "\n";
   }
-  return "<table><caption>The runs of this page</caption><thead><tr><th scope=\"col\">Run</th>"
+  return "<table class=\"runs\"><caption>The runs of this page</caption><thead><tr><th scope=\"col\">Run</th>"
          "<th scope=\"col\">Verdict</th><th scope=\"col\">Diagnostics</th><th scope=\"col\">Phone</th>"
          "<th scope=\"col\">Tags</th><th scope=\"col\">Date (UTC)</th><th scope=\"col\">Machine</th>"
          "<th scope=\"col\">Record</th></tr></thead>\n" +
@@ -84,8 +51,8 @@ std::string runsTable(const std::vector<ShownRun>& runs) {
 std::string pageOfOne(const ShownRun& run, const PageOptions& options) {
   const PageVerdict verdict = verdictOf(run);
   return document(verdict.word + ": " + htmlName(shortPhone(run.began)),
-                  bannerOf(verdict, htmlText(summaryOf(run)), factsOf(run.began)) +
-                      element("main", "\n" + runSections(run, 1, 2, options)) + "\n" + footerOf(run));
+                  bannerOf(verdict.kind, verdict.word, htmlText(summaryOf(run)), factsOf(run.began)) +
+                      element("main", "\n" + runSections(run, 1, 2, options)) + "\n" + footerOf(run.began));
 }
 
 std::string pageOfMany(const std::vector<ShownRun>& runs, const PageOptions& options) {
@@ -106,12 +73,12 @@ std::string pageOfMany(const std::vector<ShownRun>& runs, const PageOptions& opt
   const std::string sentence = countText(runs.size(), "run") + ": " + std::to_string(passed) + " passed, " +
                                std::to_string(runs.size() - passed) + " did not";
   return document(worst.word + ": " + countText(runs.size(), "run"),
-                  bannerOf(worst, sentence, "The verdict is that of the worst run.") +
+                  bannerOf(worst.kind, worst.word, sentence, "The verdict is that of the worst run.") +
                       element("main",
                               "\n<h2>Runs</h2>\n<div class=\"scroll\" tabindex=\"0\" role=\"region\" "
                               "aria-label=\"Table of runs\">" +
                                   runsTable(runs) + "</div>\n" + sections) +
-                      "\n" + footerOf(runs.front()));
+                      "\n" + footerOf(runs.front().began));
 }
 
 }  // namespace

@@ -66,6 +66,28 @@ std::string text(const char* kind, double x, double y, const std::string& conten
          content + "</text>";
 }
 
+// What both curves of a plot span.
+struct Ranges {
+  double begin;
+  double end;
+  double least;
+  double greatest;
+};
+
+Ranges rangesOf(const Plot& plot) {
+  const PlotPoint& first = plot.points.front();
+  Ranges ranges{first.x, first.x, first.y, first.y};
+  for (const std::vector<PlotPoint>* const points : {&plot.points, &plot.others}) {
+    for (const PlotPoint& point : *points) {
+      ranges.begin = std::min(ranges.begin, point.x);
+      ranges.end = std::max(ranges.end, point.x);
+      ranges.least = std::min(ranges.least, point.y);
+      ranges.greatest = std::max(ranges.greatest, point.y);
+    }
+  }
+  return ranges;
+}
+
 // Marks at the same place are one.
 std::string marksOf(const std::vector<double>& marks, const Scale& x) {
   std::string path;
@@ -83,21 +105,20 @@ std::string marksOf(const std::vector<double>& marks, const Scale& x) {
 
 std::string plotSvg(const Plot& plot) {
   if (plot.points.size() < 2) return {};
-  const auto [least, greatest] =
-      std::minmax_element(plot.points.begin(), plot.points.end(),
-                          [](const PlotPoint& one, const PlotPoint& other) { return one.y < other.y; });
-  const Scale x = scaleOf(plot.points.front().x, plot.points.back().x, kPlotLeft, kPlotWidth);
-  const Scale y = scaleOf(least->y, greatest->y, kPlotTop + kPlotHeight, -kPlotHeight);
+  const Ranges ranges = rangesOf(plot);
+  const Scale x = scaleOf(ranges.begin, ranges.end, kPlotLeft, kPlotWidth);
+  const Scale y = scaleOf(ranges.least, ranges.greatest, kPlotTop + kPlotHeight, -kPlotHeight);
   std::string svg = "<svg class=\"plot\" viewBox=\"0 0 720 140\" role=\"img\" aria-label=\"" + htmlText(plot.label) +
                     "\"><rect class=\"ground\" x=\"70\" y=\"8\" width=\"640\" height=\"110\"/>";
   svg += marksOf(plot.marks, x);
   svg += "<path class=\"median\" d=\"M70 " + coordinate(y.at(plot.median)) + "h640\"/>";
   svg += "<path class=\"curve\" d=\"" + pathOf(plot.points, x, y) + "\"/>";
-  svg += text("end", kPlotLeft - 6, kPlotTop + 10, roundedText(greatest->y));
-  svg += text("end", kPlotLeft - 6, kPlotTop + kPlotHeight, roundedText(least->y));
+  if (!plot.others.empty()) svg += "<path class=\"curve1\" d=\"" + pathOf(plot.others, x, y) + "\"/>";
+  svg += text("end", kPlotLeft - 6, kPlotTop + 10, roundedText(ranges.greatest));
+  svg += text("end", kPlotLeft - 6, kPlotTop + kPlotHeight, roundedText(ranges.least));
   svg += text("end", kPlotLeft - 6, kPlotTop + kPlotHeight / 2, htmlText(plot.unit));
-  svg += text("start", kPlotLeft, 134, roundedText(plot.points.front().x) + " s");
-  svg += text("end", kPlotLeft + kPlotWidth, 134, roundedText(plot.points.back().x) + " s");
+  svg += text("start", kPlotLeft, 134, roundedText(ranges.begin) + " s");
+  svg += text("end", kPlotLeft + kPlotWidth, 134, roundedText(ranges.end) + " s");
   return svg + "</svg>\n";
 }
 

@@ -12,11 +12,12 @@ struct PlotPoint {
 };
 
 struct Plot {
-  std::string label;              // for those who do not see it
-  std::string unit;               // of y; x is in seconds
-  std::vector<PlotPoint> points;  // finite, ascending in x
-  std::vector<double> marks{};    // x of what is marked
-  double median = 0;              // of y, shown by a line
+  std::string label;                // for those who do not see it
+  std::string unit;                 // of y; x is in seconds
+  std::vector<PlotPoint> points;    // finite, ascending in x
+  std::vector<double> marks{};      // x of what is marked
+  double median = 0;                // of y, shown by a line
+  std::vector<PlotPoint> others{};  // a second curve to compare with
 };
 
 // The size of the SVG is bounded: of many points, it has the minimum and the maximum of each of its columns. Empty for

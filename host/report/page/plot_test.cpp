@@ -33,6 +33,14 @@ TEST(PlotSvg, IsBoundedAndKeepsTheOneExtreme) {
   EXPECT_THAT(svg, HasSubstr(">66</text>"));
 }
 
+TEST(PlotSvg, ShowsTwoCurvesOnOneScale) {
+  Plot plot = plotOf(3);
+  plot.others = {{0, 33}, {4, 99}};
+  const std::string svg = plotSvg(plot);
+  EXPECT_THAT(svg, HasSubstr("<path class=\"curve\" d=\"M70 118L230 63L390 118\""));
+  EXPECT_THAT(svg, HasSubstr("<path class=\"curve1\" d=\"M70 118L710 8\""));
+}
+
 TEST(PlotSvg, TakesValuesThatAreAllEqual) {
   Plot plot = plotOf(2);
   plot.points = {{0, 5}, {1, 5}};

@@ -7,6 +7,7 @@
 
 #include <algorithm>
 #include <cstddef>
+#include <filesystem>
 #include <string_view>
 #include <vector>
 
@@ -75,6 +76,10 @@ std::string command(const RunStarted& run, const std::vector<std::string>& names
 }
 
 }  // namespace
+
+std::string shortPhone(const RunStarted& run) { return std::filesystem::path(run.phone).stem().string(); }
+
+std::string dateText(Date date) { return timestampText(date).substr(0, 19).replace(10, 1, " "); }
 
 std::string runTable(const ShownRun& shown) {
   const RunStarted& run = shown.began;

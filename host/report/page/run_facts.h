@@ -7,6 +7,12 @@
 
 namespace quazor {
 
+// The name of the phone's file, without its folder.
+std::string shortPhone(const RunStarted& run);
+
+// "2026-11-21 01:08:00", in UTC.
+std::string dateText(Date date);
+
 // A table of what identifies the run: ID, dates, phone, tags, seed, machine, program, plug-ins.
 std::string runTable(const ShownRun& run);
 

@@ -31,7 +31,7 @@ std::string idOf(std::size_t run, std::size_t record) {
 }
 
 std::string titleOf(const DiagnosticRecord& record) {
-  const std::string trial = trialText(record);
+  const std::string trial = trialTextWithSeed(record);
   return htmlName(record.name) + (trial.empty() ? "" : " " + element("span class=\"soft\"", "(" + trial + ")")) + " " +
          verdictBadge(nameOf(record.verdict));
 }
@@ -133,7 +133,7 @@ std::string findings(const ShownRun& run, std::size_t number, int level, const P
 }
 
 std::string rowOf(const DiagnosticRecord& record, const std::string& id) {
-  const std::string trial = trialText(record);
+  const std::string trial = trialTextWithSeed(record);
   const std::string results = record.skip ? textOf(*record.skip) : resultCountsText(record);
   return element("tr", element("th scope=\"row\"", "<a href=\"#" + id + "\">" + htmlName(record.name) + "</a>" +
                                                        (trial.empty() ? "" : " (" + trial + ")")) +
@@ -161,18 +161,23 @@ std::string overview(const ShownRun& run, std::size_t number, int level) {
          element("tbody", rows) + "</table>\n";
 }
 
+// Names an entry so that no other part of the page has the same label.
+std::string entryText(const ShownRun& run, std::size_t number, std::size_t index) {
+  return formatMessage("%@, entry %@ of run %@", htmlName(run.records[index].name), index + 1, number);
+}
+
 // Wide tables scroll by themselves, also with the keyboard.
 std::string scrolling(const std::string& label, const std::string& table) {
   if (table.empty()) return table;
   return "<div class=\"scroll\" tabindex=\"0\" role=\"region\" aria-label=\"" + label + "\">" + table + "</div>\n";
 }
 
-std::string framesOf(const ShownRun& run, std::size_t index, int level) {
+std::string framesOf(const ShownRun& run, std::size_t number, std::size_t index, int level) {
   const DiagnosticRecord& record = run.records[index];
   const std::string frames =
       index < run.streams.size() ? framesSection(run.streams[index], level, true) : std::string();
   if (!frames.empty() || !run.began.traced || record.skip) {
-    return scrolling("Frames of " + htmlName(record.name), frames);
+    return scrolling("Frames of " + entryText(run, number, index), frames);
   }
   return element("p class=\"soft\"", "No frame was delivered to this diagnostic, so there is no plot of frames.");
 }
@@ -184,9 +189,9 @@ std::string diagnosticSection(const ShownRun& run, std::size_t number, std::size
   std::string body = wholeName(record.name) + element("p", htmlText(record.summary));
   body += errorParagraphs(record);
   if (record.skip) body += element("p", htmlText(textOf(*record.skip)));
-  body += scrolling("Results of " + htmlName(record.name), resultsTable(record));
-  if (options.frames) body += framesOf(run, index, level + 1);
-  body += scrolling("Counters and other data of " + htmlName(record.name), auxiliarySection(record, level + 1));
+  body += scrolling("Results of " + entryText(run, number, index), resultsTable(record));
+  if (options.frames) body += framesOf(run, number, index, level + 1);
+  body += scrolling("Counters and other data of " + entryText(run, number, index), auxiliarySection(record, level + 1));
   body += measurementsSection(record, level + 1);
   body += parametersSection(record, level + 1);
   body += stagesSection(record, level + 1);
@@ -244,7 +249,7 @@ std::string runSections(const ShownRun& run, std::size_t number, int level, cons
   std::string html = stopLine(run) + findings(run, number, level, options) + overview(run, number, level);
   html += variationOf(run);
   for (std::size_t i = 0; i < run.records.size(); ++i) html += diagnosticSection(run, number, i, level, options);
-  html += heading(level, "The run") + scrolling("Facts about the run", runTable(run));
+  html += heading(level, "The run") + scrolling("Facts about run " + std::to_string(number), runTable(run));
   html += heading(level + 1, "To run it again") +
           element("p", "With the plug-ins named above and the default profile:") +
           element("pre", htmlLines(rerunCommands(run)));

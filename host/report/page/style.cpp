@@ -42,13 +42,14 @@ table{border-collapse:collapse;margin:.6rem 0 1.2rem;font-size:.9375rem}
 caption{text-align:left;color:var(--soft);padding:.2rem 0}
 th,td{text-align:left;vertical-align:top;padding:.25rem .75rem .25rem 0;border-bottom:1px solid var(--line)}
 thead th{border-bottom:2px solid var(--line);font-weight:600;white-space:nowrap}
-tbody th{font-weight:500;min-width:14rem}
+tbody th{font-weight:500;min-width:16rem}
 tbody th,.line,.whole,h1,h2,h3,h4,p{overflow-wrap:anywhere}
 .number{text-align:right;font-variant-numeric:tabular-nums;white-space:nowrap}
 tr.bad th,tr.bad td{background:var(--failground)}
 .line,pre,code{white-space:pre-wrap;font-family:ui-monospace,"DejaVu Sans Mono",Menlo,Consolas,monospace;font-size:.875rem}
 pre{background:var(--panel);border:1px solid var(--line);border-radius:4px;padding:.7rem 1rem;margin:.5rem 0}
 .whole{max-height:8rem;overflow:auto;color:var(--soft)}
+.runs tbody th{min-width:5rem}.first{color:var(--curve);font-weight:650}.second{color:var(--second);font-weight:650}
 details{border:1px solid var(--line);border-radius:6px;margin:.8rem 0;padding:0 1.1rem}
 details[open]{padding-bottom:.8rem}
 summary{cursor:pointer;padding:.7rem 0}
