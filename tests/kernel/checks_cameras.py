@@ -129,7 +129,7 @@ def selftest_cameras(step):
     expect_equal("how often each fault fired", fired, [[], [1], [1], [1]])
     expect("FrontInfrared.FrameOffset is 3" in " ".join(document["phones"][1]["default"]["reasons"]),
            f"the blind spot has no reason: {document['phones'][1]}")
-    expect("1 of 1 faults detected, 0 blind spots, 0 false alarms" in step.out("matrix"),
+    expect("By default: 1 of 1 fault detected, 0 blind spots, 0 false alarms\n" in step.out("matrix"),
            f"the matrix is {step.out('matrix')}")
 
 
