@@ -8,6 +8,7 @@
 #include "host/error/exit_code.h"
 #include "host/plugin/diagnostic_registry.h"
 #include "host/plugin/parameter_range.h"
+#include "host/text/name_pattern.h"
 
 #include <algorithm>
 #include <array>

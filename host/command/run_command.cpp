@@ -20,6 +20,7 @@
 #include "host/run/isolation.h"
 #include "host/system/identity.h"
 #include "host/system/interrupt_watcher.h"
+#include "host/text/name_pattern.h"
 #include "host/text/table.h"
 #include "host/text/timestamp.h"
 

@@ -9,6 +9,7 @@
 #include "host/plugin/plugin_trust.h"
 #include "host/plugin/profile.h"
 #include "host/plugin/profile_check.h"
+#include "host/text/name_pattern.h"
 #include "host/text/table.h"
 
 #include <algorithm>

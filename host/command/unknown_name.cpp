@@ -5,6 +5,7 @@
 #include "host/error/exit_code.h"
 #include "host/run/plugin_scan.h"
 #include "host/system/child_process.h"
+#include "host/text/name_pattern.h"
 
 #include <algorithm>
 #include <iterator>

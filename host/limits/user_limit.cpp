@@ -2,10 +2,12 @@
 
 #include "base/text/input_error.h"
 #include "contract/message_format.h"
+#include "host/text/name_pattern.h"
 #include "host/text/parameter_number.h"
 
 #include <algorithm>
 #include <array>
+#include <cctype>
 #include <cstddef>
 #include <utility>
 
@@ -37,6 +39,14 @@ bool looksLikeNumber(std::string_view text) {
   return !text.empty() && std::string_view("+-.0123456789").find(text.front()) != std::string_view::npos;
 }
 
+// True for "nan", "inf" and "infinity", which an unquoted text means as numbers.
+bool looksLikeNonFinite(std::string_view text) {
+  std::string small(text);
+  std::transform(small.begin(), small.end(), small.begin(),
+                 [](unsigned char unit) { return static_cast<char>(std::tolower(unit)); });
+  return small == "nan" || small == "inf" || small == "infinity";
+}
+
 bool isReserved(char unit) { return std::string_view("<>=!:\"+").find(unit) != std::string_view::npos; }
 
 // True if a tolerance begins there, rightly written or not.
@@ -50,10 +60,38 @@ bool isOfUnit(std::string_view text, std::size_t at) {
          !beginsTolerance(text.substr(at));
 }
 
+// Reads the number at the beginning of the text, and removes it with what separates it from the next.
+std::optional<double> takeBound(std::string_view& text) {
+  constexpr std::string_view kSeparators = " \t,;";
+  const std::size_t length = std::min({text.find_first_of(kSeparators), text.find(".."), text.size()});
+  const std::string_view bound = text.substr(0, length);
+  text.remove_prefix(length);
+  text.remove_prefix(std::min(text.find_first_not_of(kSeparators), text.size()));
+  if (text.starts_with("..")) text.remove_prefix(2);
+  text = trimmed(text);
+  try {
+    const Value number = parseNumber(bound);
+    return toDouble(&number);
+  } catch (const InputError&) {
+    return std::nullopt;
+  }
+}
+
+// How an interval without brackets is written, for example "in [80, 90]" for "A in 80..90"; empty for another text.
+std::string intervalMeantBy(std::string_view text) {
+  const std::size_t word = text.rfind(" in ");
+  if (word == std::string_view::npos) return {};
+  std::string_view bounds = trimmed(text.substr(word + 4));
+  if (!looksLikeNumber(bounds)) return {};
+  const std::optional<double> lower = takeBound(bounds);
+  const std::optional<double> upper = takeBound(bounds);
+  return lower && upper && lower < upper ? formatMessage("in [%@, %@]", *lower, *upper) : "in [LOWER, UPPER]";
+}
+
 // Reads a limit from left to right.
 class Reader {
  public:
-  explicit Reader(std::string_view text) : rest_(text) {}
+  explicit Reader(std::string_view text) : text_(text), rest_(text) {}
 
   UserLimit limit() {
     UserLimit limit;
@@ -70,7 +108,7 @@ class Reader {
       if (looksLikeNumber(rest_)) {
         limit.condition = comparisonWithNumber(comparison);
       } else {
-        RelationCondition relation{comparison, name("a number or the name of a result")};
+        RelationCondition relation{comparison, otherResult()};
         relation.tolerance = tolerance(comparison);
         limit.condition = std::move(relation);
       }
@@ -141,9 +179,31 @@ class Reader {
     return name;
   }
 
+  // The right side of a relation, which is one result.
+  std::string otherResult() {
+    skipBlanks();
+    const bool isQuoted = rest_.starts_with('"');
+    std::string other = name("a number or the name of a result");
+    if (isQuoted) return other;
+    if (looksLikeNonFinite(other)) {
+      throw InputError(
+          formatMessage("'%@' is not a finite number; a result of this name is written in double quotes", other));
+    }
+    if (isPattern(other)) {
+      throw InputError(formatMessage(
+          "the limit compares with one result, so '%@' cannot be a pattern; a result of this name is written in double "
+          "quotes",
+          other));
+    }
+    return other;
+  }
+
   LimitOperator operatorHere() {
     for (const auto& [token, comparison] : kOperators) {
       if (take(token)) return comparison;
+    }
+    if (const std::string meant = intervalMeantBy(text_); !meant.empty()) {
+      throw InputError("an interval is written in brackets: " + meant);
     }
     const std::string found = rest_.empty() ? "the end" : formatMessage("'%@'", rest_);
     throw InputError(
@@ -211,6 +271,7 @@ class Reader {
     return condition;
   }
 
+  const std::string_view text_;
   std::string_view rest_;
 };
 
@@ -223,12 +284,13 @@ std::string quotedText(const std::string& text) {
   return quoted + "\"";
 }
 
-// Quotes a name that would be read differently without quotation marks. `mayBeNumber` is true where only a name may
-// stand.
-std::string nameText(const std::string& name, bool mayBeNumber) {
+// Quotes a name that would be read differently without quotation marks. `isLeft` is true where no number may stand, and
+// a pattern may.
+std::string nameText(const std::string& name, bool isLeft) {
   const bool plain = !name.empty() && trimmed(name) == name && std::none_of(name.begin(), name.end(), isReserved) &&
                      name.find(kToleranceSign) == std::string::npos && name.find(" in") == std::string::npos &&
-                     name.find("\tin") == std::string::npos && (mayBeNumber || !looksLikeNumber(name));
+                     name.find("\tin") == std::string::npos &&
+                     (isLeft || (!looksLikeNumber(name) && !looksLikeNonFinite(name) && !isPattern(name)));
   return plain ? name : quotedText(name);
 }
 

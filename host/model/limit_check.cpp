@@ -6,6 +6,7 @@
 #include "host/model/diagnostic_record.h"
 #include "host/model/trials.h"
 #include "host/plugin/diagnostic_registry.h"
+#include "host/text/name_pattern.h"
 
 #include <algorithm>
 #include <cmath>

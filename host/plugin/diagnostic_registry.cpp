@@ -6,8 +6,8 @@
 #include "host/error/host_error.h"
 #include "host/plugin/null_platform.h"
 #include "host/plugin/parameter_range.h"
+#include "host/text/name_pattern.h"
 
-#include <fnmatch.h>
 
 #include <algorithm>
 #include <iterator>
@@ -187,13 +187,6 @@ bool contains(const std::vector<Diagnostic>& diagnostics, const Diagnostic& want
   return std::any_of(diagnostics.begin(), diagnostics.end(),
                      [&wanted](const Diagnostic& one) { return isSame(one, wanted); });
 }
-
-bool matchesName(const std::string& pattern, const std::string& name) {
-  // fnmatch() would compare two names only up to a zero byte.
-  return pattern == name || (isPattern(pattern) && fnmatch(pattern.c_str(), name.c_str(), FNM_NOESCAPE) == 0);
-}
-
-bool isPattern(const std::string& text) { return text.find_first_of("*?[") != std::string::npos; }
 
 std::vector<std::string> namesOf(const std::vector<Diagnostic>& diagnostics) {
   std::vector<std::string> names;

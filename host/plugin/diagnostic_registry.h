@@ -77,12 +77,6 @@ std::vector<Diagnostic> selectDiagnostics(const std::vector<Diagnostic>& catalog
 // True if `diagnostics` contains that diagnostic, or that experiment on its own, by name.
 bool contains(const std::vector<Diagnostic>& diagnostics, const Diagnostic& wanted);
 
-// True if `pattern` equals or matches `name`.
-bool matchesName(const std::string& pattern, const std::string& name);
-
-// True if the text contains a special character of patterns.
-bool isPattern(const std::string& text);
-
 std::vector<std::string> namesOf(const std::vector<Diagnostic>& diagnostics);
 
 }  // namespace quazor

@@ -3,6 +3,7 @@
 #include "base/json/json_cursor.h"
 #include "base/text/input_error.h"
 #include "host/plugin/diagnostic_registry.h"
+#include "host/text/name_pattern.h"
 
 #include <algorithm>
 #include <cstdint>

@@ -3,6 +3,7 @@
 #include "base/json/json_cursor.h"
 #include "contract/message_format.h"
 #include "host/error/exit_code.h"
+#include "host/text/name_pattern.h"
 
 #include <algorithm>
 #include <iterator>
