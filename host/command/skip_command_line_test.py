@@ -93,7 +93,7 @@ class SkipTest(RecordTest):
         self.assertEqual(suite.find("testcase/skipped").get("message"), 'it is hot, "very"')
         ends = [json.loads(line) for line in (self.directory / "o").read_text().splitlines() if "testRunEnd" in line]
         self.assertEqual(ends[1]["testRunArtifact"]["testRunEnd"], {"status": "SKIP", "result": "NOT_APPLICABLE"})
-        self.assertIn('Fake.Two,skip,,,,,,,,,,,,,,not-allowed,"it is hot, ""very"""', (self.directory / "c").read_text())
+        self.assertIn('Fake.Two,skip,,,,,,,,,,,,,,,not-allowed,"it is hot, ""very"""', (self.directory / "c").read_text())
 
     def test_a_record_that_says_more_of_a_skipped_one_is_wrong(self):
         self.verdicts(*HOT, code=2)
