@@ -63,6 +63,9 @@ void warnOfSuffixes(const Options& options, std::ostream& err) {
 }
 
 void checkNames(const Options& options, const std::string& what) {
+  if (!options.onlyFailed && !options.failedOf.empty()) {
+    throw CommandError(ExitCode::kUsage, "--of requires --only failed");
+  }
   const int ways = (options.names.empty() ? 0 : 1) + (options.all ? 1 : 0) + (options.onlyFailed ? 1 : 0);
   if (ways == 0) {
     throw CommandError(ExitCode::kUsage,
@@ -71,12 +74,24 @@ void checkNames(const Options& options, const std::string& what) {
   if (ways > 1 && !options.onlyFailed)
     throw CommandError(ExitCode::kUsage, "use either names of " + what + " or --all, not both");
   if (ways > 1) throw CommandError(ExitCode::kUsage, "--only failed cannot be combined with names or --all");
-  if (!options.onlyFailed && !options.failedOf.empty()) {
-    throw CommandError(ExitCode::kUsage, "--of requires --only failed");
-  }
 }
 
+namespace {
+
+// Like unknownOptionIn(), for what stands in front of the command.
+std::string unknownOptionOfProgram(const std::string& argument) {
+  const std::vector<std::string> known = {"--help", "--version"};
+  const std::string option = argument.substr(0, argument.find('='));
+  if (option == "--" || std::find(known.begin(), known.end(), option) != known.end()) return {};
+  const std::string suggestion = didYouMean(option, known);
+  return "unknown option '" + option + "'" +
+         (suggestion.empty() ? "; options follow the command, as in 'quazor run --all'" : suggestion);
+}
+
+}  // namespace
+
 std::string unknownOptionIn(const std::vector<std::string>& arguments) {
+  if (arguments.front().starts_with("--")) return unknownOptionOfProgram(arguments.front());
   const std::vector<OptionSummary> options = optionsOfCommand(arguments.front());
   if (options.empty()) return {};
   std::vector<std::string> names;

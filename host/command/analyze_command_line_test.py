@@ -59,7 +59,8 @@ class AnalyzeTest(RecordTest):
         self.assert_refused(quazor("analyze"), 64, "RECORD")
         self.assert_refused(analyze(self.record, "--set", "minimun=1"), 64, "did you mean 'minimum'?")
         self.assert_refused(analyze(self.record, "--set", "measured=1"), 64,
-                            "no analysis of the selected diagnostics has a parameter 'measured'")
+                            "no analysis of the selected diagnostics has a parameter 'measured'; the experiment has it, and an analysis cannot "
+                            "change it\n")
         self.assert_refused(analyze(self.record, "--set", "experiment.duration=1"), 64,
                             "--set 'experiment.duration=1': 'quazor analyze' does not run experiments")
         self.assert_refused(quazor("analyze", self.record, "--plugin", EXPERIMENTS), 64, "there is no diagnostic")

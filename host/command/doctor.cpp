@@ -139,13 +139,16 @@ class Doctor {
     const bool allLoaded = allFine_ && installation_.hiddenPlugins().empty();
     for (const std::filesystem::path& file : files) {
       Profile read;
+      bool hidesDefault = false;
       check("profile", file.string(), [&] {
         const std::vector<Profile> all = readProfileAndBases(file, installation_.profileSource());
         for (const Profile& one : all) one.mistakes.throwIfAny();
         read = all.back();
+        hidesDefault = file == byDefault && !hiddenDefaultProfile(installation_).empty();
         return "entries for " + countText(read.entries.size(), "diagnostic") + " and " +
                countText(read.experiments.size(), "experiment") + (file == byDefault ? "; the default profile" : "");
       });
+      if (hidesDefault) remark("profile", file.string(), std::string("it ") + kHidesDefaultProfile);
       if (allLoaded) remarkUnusedEntries(read);
     }
   }

@@ -282,13 +282,16 @@ const Explanation* findMention(const std::vector<Explanation>& explanations, con
 }
 
 [[noreturn]] void refuseName(const std::vector<Explanation>& explanations, const std::string& asked) {
+  std::vector<std::string> names;
   std::vector<std::string> known;
   for (const Explanation& one : explanations) {
+    names.insert(names.end(), one.names.begin(), one.names.end());
     known.insert(known.end(), one.names.begin(), one.names.end());
     known.insert(known.end(), one.symbols.begin(), one.symbols.end());
     if (one.isError()) known.push_back(one.domain);
   }
   std::string nearest = didYouMean(asked, known);
+  if (nearest.empty()) nearest = didYouMeanOrPattern(asked, names);  // such as the camera of a result
   const Explanation* const mention = nearest.empty() ? findMention(explanations, asked) : nullptr;
   if (mention != nullptr) nearest = "; that of '" + keysOf(*mention).front() + "' mentions it";
   throw CommandError(ExitCode::kUsage,

@@ -232,6 +232,7 @@ TEST(FindExplanations, TellsWhichOneMentionsIt) {
   };
   EXPECT_EQ(problemOf("TotalLimit"), "no explanation of 'TotalLimit'; that of 'Total' mentions it");
   EXPECT_EQ(problemOf("talLimit"), "no explanation of 'talLimit'; 'quazor explain' lists all explanations");
+  EXPECT_EQ(problemOf("To"), "no explanation of 'To'; did you mean 'Total'?");
   EXPECT_EQ(problemOf("its"), "no explanation of 'its'; 'quazor explain' lists all explanations");
 }
 

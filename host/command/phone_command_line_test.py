@@ -49,6 +49,8 @@ class PhoneListTest(CommandLineTest):
         self.assertEqual(sorted(phones), sorted(["camera_sync/frame_rate_drift", DROPPED, "healthy", str(self.phone)]))
         self.assertEqual((phones[str(self.phone)]["from"], phones[str(self.phone)]["title"]), ("file", "One camera"))
         self.assert_refused(quazor("phone", "list", "healty"), 64, "'healty'", "did you mean 'healthy'?")
+        self.assert_refused(quazor("phone", "list", "camera_sync"), 64,
+                            "camera_sync: this is a group of phones; to see them: quazor phone list 'camera_sync/*'\n")
 
     def test_an_own_phone_hides_an_installed_one(self):
         self.own("healthy.json", self.phone.read_text())

@@ -69,6 +69,17 @@ class OwnDefaultTest(ProfilesCase):
         self.assertEqual([name for name, finding in profiles if finding.endswith("; the default profile")], [str(own)])
         self.assertEqual(len([name for name, _ in profiles if name.endswith("default.json")]), 1)
 
+    def test_one_without_base_is_named_where_a_value_of_the_installed_one_is_missing(self):
+        own = self.add("default", values(duration=7))
+        hint = f'; {own} hides the shipped default profile, whose values it has only with "base": "default"'
+        run = quazor("run", "CameraSyncDiagnostic.Back", env=self.environment)
+        self.assert_refused(run, 64, "requires the parameter experiment.duration", hint + "\n")
+        doctor = " ".join(quazor("doctor", env=self.environment).stdout.split())
+        self.assertIn(f"REMARK profile {own} it hides the shipped default profile, whose values it has only with ", doctor)
+        self.add("default", {"base": "default", **values(duration=7)})
+        self.assertEqual(quazor("run", "CameraSyncDiagnostic.Back", env=self.environment).returncode, 0)
+        self.assertNotIn("it hides", quazor("doctor", env=self.environment).stdout)
+
     def profiles_of_doctor(self):
         result = quazor("doctor", env={**self.environment, "XDG_STATE_HOME": str(self.directory)})
         self.assertEqual(result.returncode, 0, result.stdout)
@@ -197,12 +208,23 @@ class LimitsForOtherValuesTest(CommandLineTest):
                 self.assertEqual((result.returncode, result.stderr), (0, ""))
 
 
+class EntriesForOthersTest(ProfilesCase):
+    def test_only_an_installed_profile_may_name_what_is_not_loaded(self):
+        content = {"schema": 1, "diagnostics": {"Fake.One": {"experiment": {"duration": 1}}, "Nowhere": {}}}
+        file = self.write("others.json", json.dumps(content))
+        self.assert_refused(self.run_one("--profile", file), 66, "Nowhere: no diagnostic has this name",
+                            "Only a profile in a folder of profiles may have entries for plug-ins that are not loaded: "
+                            "load the plug-in with --plugin, remove the entry, or put the file there and give its name.\n")
+        self.add("others", content)
+        self.assertEqual(self.run_one("--profile", "others").returncode, 0)
+
+
 class SuggestedNamesTest(ProfilesCase):
     def test_profiles(self):
         for option in ("--profile", "--parameters"):
             self.assert_refused(self.run_one(option, "strikt"), 66, "strikt: the file does not exist; did you mean 'strict'?")
         self.assert_refused(self.run_one("--profile", "strict.json"), 66, "did you mean 'strict'?")
-        self.assert_refused(self.run_one("--profile", "nothing_like_it"), 66, "nothing_like_it: the file does not exist.")
+        self.assert_refused(self.run_one("--profile", "nothing_like_it"), 66, "nothing_like_it: the file does not exist; the installed profiles are default, ")
 
     def test_phones(self):
         rows = {"camera_sync/frame_dropped": "camera_sync/frames_dropped", "frames_dropped": "camera_sync/frames_dropped",

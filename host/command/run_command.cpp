@@ -9,6 +9,7 @@
 #include "host/command/output_check.h"
 #include "host/command/report_command.h"
 #include "host/command/selection.h"
+#include "host/command/unknown_name.h"
 #include "host/device/phone.h"
 #include "host/error/host_error.h"
 #include "host/model/incomplete_run.h"
@@ -196,12 +197,7 @@ void requirePhone(const std::filesystem::path& file, const Options& options, con
                        text + "the file does not exist" +
                            didYouMeanOf(file.string(), "the installed bindings", installation.bindingNames()));
   }
-  const std::string group = file.string() + "/";
-  for (const std::string& name : installation.scenarioNames()) {
-    if (!name.starts_with(group)) continue;
-    throw CommandError(ExitCode::kCannotRead,
-                       formatMessage("%@this is a group of phones; to see them: quazor phone list '%@*'", text, group));
-  }
+  refuseGroupOfPhones(file.string(), ExitCode::kCannotRead, "--phone " + options.phone.string(), installation);
   throw CommandError(ExitCode::kCannotRead, text +
                                                 "the file does not exist, and no installed phone has this name; "
                                                 "'quazor phone list' shows them");

@@ -70,6 +70,12 @@ void addProfile(const std::filesystem::path& file, bool isNamedByPath, const Ins
 void addChosenProfile(const std::filesystem::path& name, const Installation& installation,
                       std::vector<Profile>& profiles) {
   const std::filesystem::path file = installation.profile(name);
+  std::error_code ignored;
+  if (file == name && !name.has_parent_path() && !std::filesystem::exists(name, ignored)) {
+    throw CommandError(ExitCode::kCannotRead,
+                       name.string() + ": the file does not exist" +
+                           didYouMeanOf(name.string(), "the installed profiles", installation.profileNames()));
+  }
   addProfile(file, file == name, installation, profiles);
 }
 
@@ -82,6 +88,22 @@ void refuseLimitsOfUnknown(const std::vector<UserLimit>& limits, const std::vect
     throw CommandError(ExitCode::kUsage,
                        formatMessage("--limit '%@': no diagnostic has the name '%@'%@", canonicalText(limit),
                                      limit.diagnostic, didYouMeanOrPattern(limit.diagnostic, namesOf(catalogue))));
+  }
+}
+
+// Refuses a wrong profile, and says what to do if only an entry for what is not loaded is wrong.
+void checkProfileToRun(const Profile& profile, const std::vector<DescribedDiagnostic>& catalogue) {
+  try {
+    checkProfile(profile, catalogue);
+  } catch (const CommandError& problem) {
+    if (profile.mayNameOthers) throw;
+    Profile lenient = profile;
+    lenient.mayNameOthers = true;
+    checkProfile(lenient, catalogue);
+    throw CommandError(problem.code(),
+                       problem.what() + std::string(" Only a profile in a folder of profiles may have entries for "
+                                                    "plug-ins that are not loaded: load the plug-in with --plugin, "
+                                                    "remove the entry, or put the file there and give its name."));
   }
 }
 
@@ -100,6 +122,18 @@ std::vector<Profile> profilesOf(const Options& options, const Installation& inst
   }
   for (const std::filesystem::path& name : options.parameterFiles) addChosenProfile(name, installation, profiles);
   return profiles;
+}
+
+// The end of a sentence about a parameter without a value, if the hidden default profile has an entry for it.
+std::string hintOfHiddenDefault(const Diagnostic& diagnostic, const Installation& installation) {
+  const std::filesystem::path hidden = hiddenDefaultProfile(installation);
+  if (hidden.empty()) return {};
+  const Profile shipped = readProfileToCheck(hidden);
+  const std::vector<ProfileEntry>& entries = diagnostic.experimentOnly ? shipped.experiments : shipped.entries;
+  const bool hasEntry = std::any_of(entries.begin(), entries.end(), [&diagnostic](const ProfileEntry& entry) {
+    return matchesName(entry.name, diagnostic.name);
+  });
+  return hasEntry ? "; " + installation.defaultProfile().string() + " " + kHidesDefaultProfile : std::string();
 }
 
 [[noreturn]] void refuseInterrupted() {
@@ -213,7 +247,7 @@ Selection select(const Options& options, const Installation& installation, Watch
   std::vector<Profile> profiles = profilesOf(options, installation);
   describeForProfiles(options, installation, profiles, described, signals);
   addExplainedRanges(installation.explanations(), described);
-  for (const Profile& profile : profiles) checkProfile(profile, described);
+  for (const Profile& profile : profiles) checkProfileToRun(profile, described);
   std::vector<ParameterOverride> settings = overridesOfEnvironment();
   settings.insert(settings.end(), options.settings.begin(), options.settings.end());
   std::vector<DescribedDiagnostic> selected;
@@ -241,11 +275,20 @@ void tellLimitsForOtherValues(const std::vector<Profile>& profiles, const std::v
   }
 }
 
+std::filesystem::path hiddenDefaultProfile(const Installation& installation) {
+  const std::filesystem::path own = installation.defaultProfile();
+  const ProfileSource source = installation.profileSource();
+  std::filesystem::path shipped = source("default", {own});
+  return shipped.empty() || readProfileAndBases(own, source).size() > 1 ? std::filesystem::path() : shipped;
+}
+
 std::string missingParameterOf(const ResolvedDiagnostic& one, const Options& options,
                                const Installation& installation) {
   std::string problem = missingParameterOf(one.described, one.parameters);
-  if (problem.empty() || options.withoutProfile || options.profile.empty()) return problem;
-  if (installation.profile(options.profile) == installation.defaultProfile()) return problem;
+  if (problem.empty() || options.withoutProfile) return problem;
+  if (options.profile.empty() || installation.profile(options.profile) == installation.defaultProfile()) {
+    return problem + hintOfHiddenDefault(one.described.diagnostic, installation);
+  }
   const std::string name = options.profile.string();
   return problem + "; --profile " + name + " replaces the default profile, and --parameters " + name + " adds to it";
 }
@@ -270,8 +313,9 @@ std::vector<std::string> wantedScenarios(const std::vector<std::string>& names, 
       if (matchesName(name, one) && std::find(wanted.begin(), wanted.end(), one) == wanted.end()) wanted.push_back(one);
     }
     const bool found = wanted.size() > before || std::find(wanted.begin(), wanted.end(), name) != wanted.end();
-    if (!found)
-      throw CommandError(ExitCode::kUsage, "no installed phone is called '" + name + "'" + didYouMeanPath(name, all));
+    if (found) continue;
+    refuseGroupOfPhones(name, ExitCode::kUsage, name, installation);
+    throw CommandError(ExitCode::kUsage, "no installed phone is called '" + name + "'" + didYouMeanPath(name, all));
   }
   return wanted;
 }

@@ -59,6 +59,14 @@ Selection select(const Options& options, const Installation& installation, Watch
 void tellLimitsForOtherValues(const std::vector<Profile>& profiles, const std::vector<ResolvedDiagnostic>& selected,
                               std::ostream& err);
 
+// What a user's own default profile does that is based on nothing: the end of a sentence about it.
+inline constexpr const char* kHidesDefaultProfile =
+    "hides the shipped default profile, whose values it has only with \"base\": \"default\"";
+
+// The shipped default profile if the user's own hides it and is based on nothing; otherwise empty. Throws an InputError
+// if a profile cannot be read.
+std::filesystem::path hiddenDefaultProfile(const Installation& installation);
+
 // Like missingParameterOf() of its parameters; a profile that took the place of the default one may be the reason.
 std::string missingParameterOf(const ResolvedDiagnostic& one, const Options& options, const Installation& installation);
 

@@ -2,7 +2,6 @@
 
 #include "contract/message_format.h"
 #include "host/command/selection.h"
-#include "host/error/exit_code.h"
 #include "host/run/plugin_scan.h"
 #include "host/system/child_process.h"
 #include "host/text/name_pattern.h"
@@ -59,6 +58,16 @@ void refusePhoneAsName(const std::string& name, const Installation& installation
                      formatMessage("'%@' is a simulated phone; run diagnostics on it with 'quazor run "
                                    "--all --phone %@'",
                                    name, name));
+}
+
+void refuseGroupOfPhones(const std::string& name, ExitCode code, const std::string& about,
+                         const Installation& installation) {
+  const std::string group = name + "/";
+  const std::vector<std::string> phones = installation.scenarioNames();
+  if (std::none_of(phones.begin(), phones.end(), [&group](const std::string& one) { return one.starts_with(group); }))
+    return;
+  throw CommandError(
+      code, formatMessage("%@: this is a group of phones; to see them: quazor phone list '%@*'", about, group));
 }
 
 void refuseUnknownName(const std::vector<Diagnostic>& catalogue, const Options& options,

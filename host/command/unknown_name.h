@@ -3,6 +3,7 @@
 
 #include "host/cli/command_line.h"
 #include "host/cli/installation.h"
+#include "host/error/exit_code.h"
 #include "host/plugin/diagnostic_registry.h"
 
 #include <string>
@@ -12,6 +13,11 @@ namespace quazor {
 
 // Throws a CommandError (kUsage) if it is the name of an installed phone.
 void refusePhoneAsName(const std::string& name, const Installation& installation);
+
+// Throws a CommandError with that code if it is the beginning of installed phones, such as "camera_sync". The message
+// begins with `about`.
+void refuseGroupOfPhones(const std::string& name, ExitCode code, const std::string& about,
+                         const Installation& installation);
 
 // Throws the refusal of the first name of the options that fits nothing in the catalogue, with the way out: the plug-in
 // that must be named, that it is a phone, or the command that lists all names. Returns if there is no such name.

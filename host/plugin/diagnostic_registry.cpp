@@ -8,7 +8,6 @@
 #include "host/plugin/parameter_range.h"
 #include "host/text/name_pattern.h"
 
-
 #include <algorithm>
 #include <iterator>
 #include <string_view>

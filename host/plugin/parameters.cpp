@@ -160,9 +160,12 @@ void checkOverrides(const std::vector<ParameterOverride>& settings, const std::v
       const std::string noun = nounOf(selected);
       const std::string where = setting.part ? "no " + std::string(nameOf(*setting.part)) + " of the selected " + noun
                                              : "none of the selected " + noun;
+      const bool isOfExperiment =
+          setting.part == Part::kAnalysis && contains(declaredNames(selected, Part::kExperiment), setting.name);
+      const std::string wayOut = isOfExperiment ? "; the experiment has it, and an analysis cannot change it"
+                                                : didYouMean(setting.name, names);
       throw CommandError(ExitCode::kUsage, quoted(setting.place, setting.text) + ": " + where + " has a parameter '" +
-                                               setting.name + "'" + didYouMean(setting.name, names) +
-                                               noteOfUndescribed(selected));
+                                               setting.name + "'" + wayOut + noteOfUndescribed(selected));
     }
     checkRange(setting, selected);
     for (std::size_t j = 0; j < i; ++j) {

@@ -70,7 +70,8 @@ TEST(CheckSettings, RefusesWhatNoneOfTheDiagnosticsTakes) {
             "--set 'duratoin=3': none of the selected diagnostics has a parameter 'duratoin'; "
             "did you mean 'duration'?");
   EXPECT_EQ(check({"analysis.duration=3"}, {sync()}),
-            "--set 'analysis.duration=3': no analysis of the selected diagnostics has a parameter 'duration'");
+            "--set 'analysis.duration=3': no analysis of the selected diagnostics has a parameter 'duration'; "
+            "the experiment has it, and an analysis cannot change it");
   EXPECT_EQ(check({"duration=3", "timeout=3"}, {sync(), fault()}), "accepted");
   EXPECT_THAT(check({"duration=3"}, {fault()}), HasSubstr("has a parameter 'duration'"));
 }
@@ -81,7 +82,8 @@ TEST(CheckSettings, SpeaksOfWhatIsSelected) {
   };
   EXPECT_EQ(check("x=3", {imagesAlone()}), "--set 'x=3': none of the selected experiments has a parameter 'x'");
   EXPECT_EQ(check("analysis.images=3", {imagesAlone()}),
-            "--set 'analysis.images=3': no analysis of the selected experiments has a parameter 'images'");
+            "--set 'analysis.images=3': no analysis of the selected experiments has a parameter 'images'; "
+            "the experiment has it, and an analysis cannot change it");
   EXPECT_EQ(check("x=3", {imagesAlone(), fault()}),
             "--set 'x=3': none of the selected diagnostics and experiments has a parameter 'x'");
   EXPECT_EQ(check("experiment.images=3", {imagesAlone()}), "accepted");
