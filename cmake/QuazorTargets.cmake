@@ -105,7 +105,7 @@ function(quazor_library name)
   file(RELATIVE_PATH folder ${PROJECT_SOURCE_DIR} ${CMAKE_CURRENT_SOURCE_DIR})
   # The host, tests and what reads or writes JSON wait for hardware and disks: optimising them fully takes a third of the
   # build's time, and nobody feels it.
-  if(name MATCHES "^host_" OR folder MATCHES "^tests" OR "nlohmann_json::nlohmann_json" IN_LIST ARG_DEPENDS)
+  if(folder MATCHES "^(host|tests)" OR "nlohmann_json::nlohmann_json" IN_LIST ARG_DEPENDS)
     quazor_precompile(quazor_${name} json ${QUAZOR_COMMON_HEADERS} <nlohmann/json.hpp>)
     target_compile_options(quazor_${name} PRIVATE $<$<CONFIG:Release>:-O1> $<$<CONFIG:Debug>:-O0>)
   else()
@@ -141,9 +141,6 @@ function(quazor_compile_quickly target)
   if(QUAZOR_SANITIZE MATCHES undefined AND NOT folder MATCHES "^(contract|platform|base)")
     target_compile_options(${target} PRIVATE -fno-sanitize=undefined)
   endif()
-  if(QUAZOR_SANITIZE)
-    target_compile_options(${target} PRIVATE -g0)  # a report names the test's function, and the product's lines
-  endif()
 endfunction()
 
 # quazor_test(NAME SOURCES ... DEPENDS ...): a GoogleTest program and its CTest entry.
@@ -157,6 +154,9 @@ function(quazor_test name)
   target_link_libraries(${name} PRIVATE ${ARG_DEPENDS} GTest::gmock GTest::gtest_main)
   quazor_configure(${name})
   quazor_compile_quickly(${name})
+  if(QUAZOR_SANITIZE)
+    target_compile_options(${name} PRIVATE -g0)  # a report names the test's function, and the product's lines
+  endif()
   quazor_precompile(${name} test ${QUAZOR_COMMON_HEADERS} <gmock/gmock.h> <gtest/gtest.h> <nlohmann/json.hpp>)
   set_target_properties(${name} PROPERTIES RUNTIME_OUTPUT_DIRECTORY ${PROJECT_BINARY_DIR}/tests)
   add_test(NAME ${name} COMMAND ${name} --gtest_brief=1)
