@@ -164,8 +164,9 @@ void checkOverrides(const std::vector<ParameterOverride>& settings, const std::v
           setting.part == Part::kAnalysis && contains(declaredNames(selected, Part::kExperiment), setting.name);
       const std::string wayOut = isOfExperiment ? "; the experiment has it, and an analysis cannot change it"
                                                 : didYouMean(setting.name, names);
-      throw CommandError(ExitCode::kUsage, quoted(setting.place, setting.text) + ": " + where + " has a parameter '" +
-                                               setting.name + "'" + wayOut + noteOfUndescribed(selected));
+      throw CommandError(ExitCode::kUsage,
+                         formatMessage("%@: %@ has a parameter '%@'%@%@", quoted(setting.place, setting.text), where,
+                                       setting.name, wayOut, noteOfUndescribed(selected)));
     }
     checkRange(setting, selected);
     for (std::size_t j = 0; j < i; ++j) {
