@@ -39,6 +39,43 @@ class TimelineTest(RecordTest):
         steps = {round((after["ts"] - before["ts"]) * 1000) for before, after in zip(frames, frames[1:])}
         self.assertLessEqual(steps, {33333333, 33333334})
 
+    def test_a_run_writes_the_same(self):
+        line = self.directory / "run.trace.json"
+        self.run_diagnostics("--output", f"trace:{line}", "--phone", "camera_sync/frames_dropped")
+        self.assertEqual(line.read_text(), self.report().stdout)
+        self.assertIn('"name":"frame 10"', line.read_text())
+        again = quazor("analyze", self.record, "--record", self.directory / "again.jsonl", "--output", f"trace:{line}")
+        self.assertEqual(again.returncode, 0, again.stderr)
+        self.record = self.directory / "again.jsonl"
+        self.assertEqual(line.read_text(), self.report().stdout)
+        self.assertIn('"analyzed":', line.read_text())
+
+    def test_a_run_without_a_record(self):
+        line = self.directory / "run.trace.json"
+        for places in (["--output", f"trace:{line}"], ["--format", "trace", "--output", line]):
+            with self.subTest(places=places):
+                result = quazor("experiment", "SingleCameraExperiment", *places)
+                self.assertEqual((result.returncode, result.stderr), (0, ""))
+                names = [event["name"] for event in timeline_of(line)]
+                self.assertIn("SingleCameraExperiment", names)
+                self.assertGreater(sum(name.startswith("frame ") for name in names), 80)
+                line.unlink()
+        result = quazor("run", "SingleCameraDiagnostic", "--format", "trace")
+        self.assertEqual((result.returncode, result.stderr), (0, ""))
+        self.assertEqual([event["name"] for event in json.loads(result.stdout)["traceEvents"]
+                          if event["ph"] == "X" and event["tid"] == 0], ["SingleCameraDiagnostic", "run"])
+
+    def test_a_run_that_cannot_write_it(self):
+        for output, code, text in (("trace:", 64, "--output 'trace:': the file name is missing"),
+                                   ("trcae:line", 64, "did you mean 'trace'"),
+                                   (f"{self.directory}/line:trace", 64, "the format comes first"),
+                                   (f"trace:{self.directory}/missing/line", 73, "missing"),
+                                   ("trace:/dev/full", 73, "/dev/full")):
+            with self.subTest(output=output):
+                result = quazor("run", "SingleCameraDiagnostic", "--output", output)
+                self.assertEqual(result.returncode, code, result.stderr)
+                self.assertIn(text, result.stderr)
+
     def test_the_console_gets_the_same(self):
         self.run_diagnostics()
         output = self.directory / "run.trace.json"
