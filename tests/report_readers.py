@@ -348,13 +348,20 @@ def width_of(character):
 def columns_of(line, begins):
     """The cells of a table line, as bytes. A blank precedes every cell, so blanks at the beginning of a cell belong to
     it."""
-    ends = {}  # from the last column of a character to the byte after it
+    cuts = []
     column = at = 0
-    for character in line.decode():
-        column += width_of(character)
-        at += len(character.encode())
-        ends.setdefault(column, at)
-    cuts = [ends[begin] for begin in begins]
+    for piece in re.findall("[ -~]+|[^ -~]", line.decode()):  # most of a table is blanks
+        is_ascii = piece.isascii()
+        width = len(piece) if is_ascii else width_of(piece)
+        while len(cuts) < len(begins) and begins[len(cuts)] <= column + width:
+            inside = begins[len(cuts)] - column
+            if inside != width and not is_ascii:
+                raise ValueError(f"column {begins[len(cuts)]} is in the middle of {piece!r}")
+            cuts.append(at + (inside if is_ascii else len(piece.encode())))
+        column += width
+        at += len(piece.encode())
+    if len(cuts) < len(begins):
+        raise ValueError(f"a line of a table ends before column {begins[len(cuts)]}")
     return [line[begin:end] for begin, end in zip(cuts, cuts[1:] + [len(line)])]
 
 
