@@ -52,6 +52,8 @@ class CompletionTest(unittest.TestCase):
 
     def test_values(self):
         self.assertEqual(self.complete("run", "--format", "j"), ["json", "junit"])
+        self.assertEqual(self.complete("run", "--output", "t"), ["text:", "trace:"])
+        self.assertEqual(self.complete("run", "--output", "h"), ["html:"])
         self.assertEqual(self.complete("run", "--log-level", "de"), ["default", "debug"])
         self.assertEqual(self.complete("run", "--deadline", "te"), ["teardown="])
         self.assertEqual(self.complete("run", "--only", ""), ["failed"])

@@ -428,7 +428,7 @@ class Generator {
 
 bool writeSamples(const std::filesystem::path& directory, std::size_t count, std::uint64_t seed) {
   std::vector<std::ofstream> files;
-  for (const Format format : kFormats) files.emplace_back(directory / nameOf(format), std::ios::binary);
+  for (const Format format : kRecordFormats) files.emplace_back(directory / nameOf(format), std::ios::binary);
   files.emplace_back(directory / "record", std::ios::binary);
   TextContent text;
   text.verbose = true;
@@ -437,8 +437,9 @@ bool writeSamples(const std::filesystem::path& directory, std::size_t count, std
   for (std::size_t i = 0; i < count; ++i) {
     const auto [run, records, interrupted] = generator.sample();
     for (std::size_t at = 0; at < files.size(); ++at) {
-      const std::string report = at < std::size(kFormats) ? reportText(kFormats[at], run, records, interrupted, text)
-                                                          : recordOf(run, records, interrupted);
+      const std::string report = at < std::size(kRecordFormats)
+                                     ? reportText(kRecordFormats[at], run, records, interrupted, text)
+                                     : recordOf(run, records, interrupted);
       files[at] << report.size() << '\n' << report;
     }
   }

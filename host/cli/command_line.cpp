@@ -338,7 +338,7 @@ void declareLookingCommands(CLI::App& app, RawOptions& raw) {
 }
 
 void declareRunningCommands(CLI::App& app, RawOptions& raw) {
-  const std::vector<std::string> formats = {"text", "json", "csv", "ocp", "junit", "html"};
+  const std::vector<std::string> formats = formatNames();
   CLI::App& run = *app.add_subcommand("run", "Run diagnostics: measure, then compare the results with their limits");
   addNames(run, raw.names, "A diagnostic's");
   run.add_option("--only", raw.only,

@@ -48,6 +48,6 @@ RecordReport recordReportOf(const ReportCommandTexts& texts, const std::vector<s
   return report;
 }
 
-Format formatOf(const RecordReport& report) { return report.isTimeline ? Format::kJson : Format::kHtml; }
+Format formatOf(const RecordReport& report) { return report.isTimeline ? Format::kTrace : Format::kHtml; }
 
 }  // namespace quazor

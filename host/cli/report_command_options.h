@@ -36,7 +36,6 @@ void addReportCommandOptions(CLI::App& command, ReportCommandTexts& texts);
 // Throws a CommandError (kUsage) that begins with the option.
 RecordReport recordReportOf(const ReportCommandTexts& texts, const std::vector<std::string>& records);
 
-// A time line is JSON.
 Format formatOf(const RecordReport& report);
 
 }  // namespace quazor

@@ -57,12 +57,12 @@ class Completer {
 
  private:
   std::vector<std::string> valuesOf(const std::string& option) const {
-    if (option == "--format") {
-      std::vector<std::string> names;
-      for (const Format format : kFormats) names.emplace_back(nameOf(format));
+    if (option == "--format") return formatNames();
+    if (option == "--output") {
+      std::vector<std::string> names = formatNames();
+      for (std::string& name : names) name += ":";
       return names;
     }
-    if (option == "--output") return {"text:", "json:", "csv:", "ocp:", "junit:"};
     if (option == "--log-level") return {"error", "default", "debug"};
     if (option == "--only") return {"failed"};
     if (option == "--trace") return {"off", "frames", "frames=all"};

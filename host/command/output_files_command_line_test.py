@@ -260,7 +260,7 @@ class OutputFilesTest(CommandLineTest):
         self.assertEqual(self.told(result), [
             "quazor: the json report goes to 'r.jsonl', whose suffix suggests a record or ocp; for that, use --record "
             "r.jsonl or --output ocp:r.jsonl"])
-        for output in ("junit:r.xml", "json:r.json", "ocp:r.jsonl", "ocp:r.json", "r.txt", "r.log", "csv:r.csv", "junit:r.pdf", "r"):
+        for output in ("junit:r.xml", "json:r.json", "ocp:r.jsonl", "ocp:r.json", "trace:r.json", "r.txt", "r.log", "csv:r.csv", "junit:r.pdf", "r"):
             with self.subTest(output):
                 result = self.run_fake("--output", output, cwd=self.directory)
                 self.assertEqual((result.returncode, self.told(result)), (0, []))

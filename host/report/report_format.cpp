@@ -22,6 +22,7 @@
 #include <cstddef>
 #include <iterator>
 #include <sstream>
+#include <stdexcept>
 #include <utility>
 
 namespace quazor {
@@ -54,9 +55,16 @@ std::string_view nameOf(Format format) {
     case Format::kCsv: return "csv";
     case Format::kOcp: return "ocp";
     case Format::kJunit: return "junit";
-    case Format::kHtml: break;
+    case Format::kHtml: return "html";
+    case Format::kTrace: break;
   }
-  return "html";
+  return "trace";
+}
+
+std::vector<std::string> formatNames() {
+  std::vector<std::string> names;
+  for (const Format format : kFormats) names.emplace_back(nameOf(format));
+  return names;
 }
 
 std::optional<Format> formatNamed(std::string_view name) {
@@ -91,11 +99,9 @@ OutputRequest parseOutput(const std::string& text, Format usual) {
   }
   refuseSwapped(text, usual);
   if (colon == std::string::npos || !isWord) return {usual, text};
-  std::vector<std::string> names;
-  for (const Format format : kFormats) names.emplace_back(nameOf(format));
   throw CommandError(ExitCode::kUsage, "--output '" + text + "': unknown format '" + word +
                                            "' (for a file of this name, write './" + text + "')" +
-                                           didYouMean(word, names));
+                                           didYouMean(word, formatNames()));
 }
 
 std::optional<Format> otherFormatOfSuffix(const OutputRequest& output) {
@@ -108,8 +114,9 @@ std::optional<Format> otherFormatOfSuffix(const OutputRequest& output) {
   const auto* const found = std::find_if(std::begin(kSuffixes), std::end(kSuffixes),
                                          [&suffix](const auto& one) { return one.first == suffix; });
   if (found == std::end(kSuffixes) || found->second == output.format) return std::nullopt;
-  // Each line of an OCP report is JSON.
-  if (output.format == Format::kOcp && found->second == Format::kJson) return std::nullopt;
+  // A time line is JSON, and so is each line of an OCP report.
+  const bool isJson = output.format == Format::kTrace || output.format == Format::kOcp;
+  if (isJson && found->second == Format::kJson) return std::nullopt;
   return found->second;
 }
 
@@ -131,6 +138,7 @@ std::string reportText(Format format, const RunStarted& run, const std::vector<D
       const std::vector<DiagnosticRecord> all = withInterruptedOfAnalysis(run, records, interrupted);
       return text.page({run, all, streams, interrupted});
     }
+    case Format::kTrace: throw std::invalid_argument("a time line is made from events");
     case Format::kJson: break;
   }
   nlohmann::ordered_json document =

@@ -7,19 +7,26 @@
 
 #include <filesystem>
 #include <functional>
+#include <iterator>
 #include <optional>
+#include <span>
 #include <string>
 #include <string_view>
 #include <vector>
 
 namespace quazor {
 
-enum class Format { kText, kJson, kCsv, kOcp, kJunit, kHtml };
+enum class Format { kText, kJson, kCsv, kOcp, kJunit, kHtml, kTrace };
 
-inline constexpr Format kFormats[] = {Format::kText, Format::kJson,  Format::kCsv,
-                                      Format::kOcp,  Format::kJunit, Format::kHtml};
+inline constexpr Format kFormats[] = {Format::kText,  Format::kJson, Format::kCsv,  Format::kOcp,
+                                      Format::kJunit, Format::kHtml, Format::kTrace};
+// Those of reportText(). A time line is made from events (timeline.h).
+inline constexpr std::span kRecordFormats = std::span(kFormats).first(std::size(kFormats) - 1);
 
-std::string_view nameOf(Format format);  // "text", "json", "csv", "ocp", "junit", "html"
+std::string_view nameOf(Format format);  // "text", "json", "csv", "ocp", "junit", "html", "trace"
+
+// Of all formats, in their order.
+std::vector<std::string> formatNames();
 
 // The format with that name, or nothing.
 std::optional<Format> formatNamed(std::string_view name);
@@ -59,8 +66,8 @@ struct TextContent {
   std::function<std::string(const ShownRun& run)> page{};  // writes the HTML page (page/page.h)
 };
 
-// The complete report of a run. `interrupted` as in RunEnded. `text` only matters for kText, but
-// `allowSkips` also for kJunit, and `page`, which is then required, for kHtml, as `streams` do.
+// The complete report of a run in one of kRecordFormats. `interrupted` as in RunEnded. `text` only matters for kText,
+// but `allowSkips` also for kJunit, and `page`, which is then required, for kHtml, as `streams` do.
 std::string reportText(Format format, const RunStarted& run, const std::vector<DiagnosticRecord>& records,
                        const std::optional<std::string>& interrupted, const TextContent& text = {},
                        const RunStreams& streams = {});

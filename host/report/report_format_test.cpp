@@ -22,7 +22,7 @@ using testing::HasSubstr;
 using testing::StartsWith;
 
 TEST(Formats, HaveNamesByWhichTheyAreFound) {
-  constexpr std::string_view kNames[] = {"text", "json", "csv", "ocp", "junit", "html"};
+  constexpr std::string_view kNames[] = {"text", "json", "csv", "ocp", "junit", "html", "trace"};
   for (std::size_t i = 0; i < std::size(kFormats); ++i) {
     EXPECT_EQ(nameOf(kFormats[i]), kNames[i]);
     EXPECT_EQ(formatNamed(kNames[i]), kFormats[i]);
@@ -50,6 +50,7 @@ TEST(ParseOutput, TakesAFormatBeforeAColon) {
       {"C3:report", Format::kCsv, "C3:report"},
       {"json", Format::kCsv, "json"},
       {"json:", Format::kJson, ""},
+      {"trace:run.json", Format::kTrace, "run.json"},
       {"./json:report", Format::kCsv, "./json:report"},
       {":report", Format::kCsv, ":report"},
       {":json", Format::kCsv, ":json"},

@@ -29,10 +29,21 @@ std::string suffixOf(const DiagnosticStarted& diagnostic, const RunStarted& run)
   return trial.empty() ? trial : ", " + trial;
 }
 
-bool hasPage(const ReportOptions& options) {
-  return options.format == Format::kHtml ||
+bool isRequested(Format format, const ReportOptions& options) {
+  return options.format == format ||
          std::any_of(options.outputs.begin(), options.outputs.end(),
-                     [](const OutputRequest& output) { return output.format == Format::kHtml; });
+                     [format](const OutputRequest& output) { return output.format == format; });
+}
+
+const std::string& textOf(Timeline& timeline) {
+  try {
+    return timeline.text();
+  } catch (const TimelineTooLarge& refusal) {
+    throw CommandError(ExitCode::kCannotWrite,
+                       std::string(refusal.what()) +
+                           ", which few viewers open, and is not written; 'quazor report RECORD --format trace' makes "
+                           "one of a part of a record, with --from SECONDS and --to SECONDS");
+  }
 }
 
 }  // namespace
@@ -41,9 +52,12 @@ RunReport::RunReport(ReportOptions options, Console& console)
     : options_(std::move(options)),
       console_(console),
       progress_(console.showsProgress ? &console.err : nullptr),
-      keepsFrames_(hasPage(options_)) {}
+      keepsFrames_(isRequested(Format::kHtml, options_)) {
+  if (isRequested(Format::kTrace, options_)) timeline_.emplace(TimelinePart{}, options_.maxTimeline);
+}
 
 void RunReport::onEvent(const RunEvent& event) {
+  if (timeline_) timeline_->onEvent(event);
   if (const auto* const began = std::get_if<RunStarted>(&event)) {
     run_ = *began;
     if (options_.output.empty() && options_.format == Format::kText) printRun(console_.out, run_);
@@ -130,27 +144,28 @@ void RunReport::finishRun(const RunEnded& event) {
   if (toFile || options_.format == Format::kText) {
     printEnd(console_.out, run_, records_, interrupted, options_.text, console_.colour);
   }
-  if (!toFile && options_.format != Format::kText) {
-    writeUnfolded(console_.out, reportAs(options_.format, interrupted));
-  }
+  if (!toFile && options_.format != Format::kText) writeReport({options_.format, {}}, interrupted);
   console_.out.flush();
   if (interrupted) console_.err << "quazor: " << interruptionText(run_, *interrupted) << '\n';
   if (!console_.out) {
     console_.err << "quazor: standard output cannot be written\n";
     allWritten_ = false;
   }
-  if (toFile) writeFile({options_.format, options_.output}, interrupted);
-  for (const OutputRequest& output : options_.outputs) writeFile(output, interrupted);
+  if (toFile) writeReport({options_.format, options_.output}, interrupted);
+  for (const OutputRequest& output : options_.outputs) writeReport(output, interrupted);
   console_.err.flush();
 }
 
-std::string RunReport::reportAs(Format format, const std::optional<std::string>& interrupted) const {
-  return reportText(format, run_, records_, interrupted, options_.text, streams_);
-}
-
-void RunReport::writeFile(const OutputRequest& output, const std::optional<std::string>& interrupted) {
+void RunReport::writeReport(const OutputRequest& output, const std::optional<std::string>& interrupted) {
+  const auto write = [&](const std::string& text) {
+    output.file.empty() ? writeUnfolded(console_.out, text) : writeOutputFile(output.file, text);
+  };
   try {
-    writeOutputFile(output.file, reportAs(output.format, interrupted));
+    if (output.format == Format::kTrace) {
+      write(textOf(*timeline_));
+    } else {
+      write(reportText(output.format, run_, records_, interrupted, options_.text, streams_));
+    }
   } catch (const CommandError& problem) {
     console_.err << "quazor: " << printable(problem.what()) << '\n';
     allWritten_ = false;

@@ -8,6 +8,7 @@
 #include "host/model/trials.h"
 #include "host/report/progress.h"
 #include "host/report/report_format.h"
+#include "host/report/timeline.h"
 
 #include <chrono>
 #include <cstddef>
@@ -38,6 +39,7 @@ struct ReportOptions {
   LogLevel shownLog = LogLevel::kError;  // lines up to this level go to the console's error stream
   ExitRules exitRules{};
   TextContent text{};
+  std::size_t maxTimeline = kMaxTimeline;  // bytes
 };
 
 // The text report is printed after each diagnostic, all other formats at the end of the run. If the report goes to a
@@ -69,8 +71,8 @@ class RunReport final : public RunEventSink {
   // After the last record of a repetition.
   void endRepetition();
   void finishRun(const RunEnded& event);
-  std::string reportAs(Format format, const std::optional<std::string>& interrupted) const;
-  void writeFile(const OutputRequest& output, const std::optional<std::string>& interrupted);
+  // To the console if the name of the file is empty.
+  void writeReport(const OutputRequest& output, const std::optional<std::string>& interrupted);
 
   const ReportOptions options_;
   Console& console_;
@@ -81,6 +83,7 @@ class RunReport final : public RunEventSink {
   std::vector<DiagnosticRecord> records_;
   const bool keepsFrames_;  // for a page
   RunStreams streams_;
+  std::optional<Timeline> timeline_;  // if one is requested
   bool allWritten_ = true;
 };
 

@@ -208,6 +208,31 @@ TEST_F(RunReportTest, SaysSoWhenInterruptedBetweenTwoDiagnostics) {
   EXPECT_EQ(err_.str(), "quazor: interrupted while no diagnostic was running\n");
 }
 
+TEST_F(RunReportTest, WritesATimeLineOfEveryEventToEachPlace) {
+  ReportOptions options;
+  options.format = Format::kTrace;
+  for (const char* const file : {"one", "two"}) options.outputs.push_back({Format::kTrace, directory_.path() / file});
+  RunReport report(options, console_);
+  for (const RunEvent& event : wholeRun()) report.onEvent(event);
+  EXPECT_EQ(report.exitCode(), ExitCode::kAllPassed);
+  EXPECT_EQ(out_.str(), timelineText(wholeRun()));
+  EXPECT_EQ(directory_.read("one"), out_.str());
+  EXPECT_EQ(directory_.read("two"), out_.str());
+}
+
+TEST_F(RunReportTest, WritesNoTimeLineThatIsTooLarge) {
+  ReportOptions options;
+  options.outputs = {{Format::kTrace, directory_.path() / "line"}, {Format::kJson, directory_.path() / "json"}};
+  options.maxTimeline = timelineText(wholeRun()).size() / 2;
+  RunReport report(options, console_);
+  for (const RunEvent& event : wholeRun()) report.onEvent(event);
+  EXPECT_EQ(report.exitCode(), ExitCode::kCannotWrite);
+  EXPECT_THAT(err_.str(), HasSubstr("quazor: the time line is longer than 0 MB, which few viewers open, and is not "
+                                    "written; 'quazor report RECORD --format trace' makes one of a part of a record"));
+  EXPECT_FALSE(std::filesystem::exists(directory_.path() / "line"));
+  EXPECT_TRUE(std::filesystem::exists(directory_.path() / "json"));
+}
+
 TEST_F(RunReportTest, WritesFurtherReportsInTheirFormats) {
   ReportOptions options;
   for (const Format format : kFormats) {
@@ -225,6 +250,7 @@ TEST_F(RunReportTest, WritesFurtherReportsInTheirFormats) {
   EXPECT_THAT(directory_.read("junit"), testing::StartsWith("<?xml"));
   EXPECT_THAT(directory_.read("ocp"), testing::StartsWith("{\"schemaVersion\""));
   EXPECT_EQ(directory_.read("html"), "page of A");
+  EXPECT_EQ(Json::parse(directory_.read("trace")).count("traceEvents"), 1U);
 }
 
 TEST_F(RunReportTest, GivesThePageTheFramesOfEachDiagnostic) {

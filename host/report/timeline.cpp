@@ -51,42 +51,56 @@ nanoseconds sumOf(nanoseconds one, nanoseconds other) {
 
 nanoseconds between(Date begin, Date end) { return sumOf(end.time_since_epoch(), -begin.time_since_epoch()); }
 
-// The diagnostic that is running; its times are those of the time line.
-struct Running {
-  int process = 0;
-  DiagnosticStarted began;
-  nanoseconds begin{};
-  nanoseconds zero{};    // of the phone's clock
-  nanoseconds cursor{};  // the end of the last stage
-  nanoseconds latest{};
-  std::optional<StageStarted> stage;
-  std::map<Stage, nanoseconds> ends;
-  std::optional<Failed> failure;
-  std::optional<Skip> skip;
-  std::map<std::string, int> streams;
-  std::map<std::string, std::uint64_t> steps;
-};
+}  // namespace
 
 // Thread: one at a time.
-class TimelineWriter {
+class Timeline::Writer {
  public:
-  TimelineWriter(const TimelinePart& part, std::size_t most) : part_(part), most_(most) {}
+  Writer(const TimelinePart& part, std::size_t most) : part_(part), most_(most) {}
 
   void add(const RunEvent& event) {
+    if (isTooLarge_) return;
     std::visit([this](const auto& one) { take(one); }, event);
   }
 
-  std::string finish() {
-    if (!run_) return "{\"traceEvents\":[]}\n";
+  const std::string& finish() {
+    if (!isFinished_) addEnd();
+    isFinished_ = true;
+    if (isTooLarge_) {
+      throw TimelineTooLarge("the time line is longer than " + std::to_string(most_ / 1'000'000) + " MB");
+    }
+    return text_;
+  }
+
+ private:
+  // The diagnostic that is running; its times are those of the time line.
+  struct Running {
+    int process = 0;
+    DiagnosticStarted began;
+    nanoseconds begin{};
+    nanoseconds zero{};    // of the phone's clock
+    nanoseconds cursor{};  // the end of the last stage
+    nanoseconds latest{};
+    std::optional<StageStarted> stage;
+    std::map<Stage, nanoseconds> ends;
+    std::optional<Failed> failure;
+    std::optional<Skip> skip;
+    std::map<std::string, int> streams;
+    std::map<std::string, std::uint64_t> steps;
+  };
+
+  void addEnd() {
+    if (!run_) {
+      text_ = "{\"traceEvents\":[]}\n";
+      return;
+    }
     if (diagnostic_) endDiagnostic(std::nullopt);
     addRow(0, kWholeRow, "run");
     addProcess(0, "quazor");
     addDuration({0, kWholeRow}, nanoseconds(0), end_, "run", textOf(runJson(*run_)));
     text_ += "\n]}\n";
-    return std::move(text_);
   }
 
- private:
   struct Row {
     int process;
     int row;
@@ -100,7 +114,8 @@ class TimelineWriter {
   void take(const DiagnosticStarted& began) {
     if (!run_) return;
     if (diagnostic_) endDiagnostic(std::nullopt);
-    Running& running = diagnostic_.emplace();
+    diagnostic_ = std::make_unique<Running>();
+    Running& running = *diagnostic_;
     running.process = ++processes_;
     running.began = began;
     running.begin = std::max(between(run_->date, began.date), end_);
@@ -268,29 +283,38 @@ class TimelineWriter {
   }
 
   void addEvent(const char* kind, Row row, const std::string& content) {
+    if (isTooLarge_) return;
     text_ += text_.ends_with('[') ? "\n" : ",\n";
     text_ += "{\"ph\":\"" + std::string(kind) + "\",\"pid\":" + std::to_string(row.process) +
              ",\"tid\":" + std::to_string(row.row) + content + "}";
-    if (text_.size() > most_) {
-      throw TimelineTooLarge("the time line is longer than " + std::to_string(most_ / 1'000'000) + " MB");
-    }
+    if (text_.size() <= most_) return;
+    isTooLarge_ = true;
+    text_ = {};
   }
 
   const TimelinePart part_;
   const std::size_t most_;
   std::optional<RunStarted> run_;
-  std::optional<Running> diagnostic_;
+  std::unique_ptr<Running> diagnostic_;
   int processes_ = 0;
   nanoseconds end_{};  // of the last diagnostic, later of the run
   std::string text_;
+  bool isTooLarge_ = false;
+  bool isFinished_ = false;
 };
 
-}  // namespace
+Timeline::Timeline(const TimelinePart& part, std::size_t most) : writer_(std::make_unique<Writer>(part, most)) {}
+
+Timeline::~Timeline() = default;
+
+void Timeline::onEvent(const RunEvent& event) { writer_->add(event); }
+
+const std::string& Timeline::text() { return writer_->finish(); }
 
 std::string timelineText(const std::vector<RunEvent>& events, const TimelinePart& part, std::size_t most) {
-  TimelineWriter writer(part, most);
-  for (const RunEvent& event : events) writer.add(event);
-  return writer.finish();
+  Timeline timeline(part, most);
+  for (const RunEvent& event : events) timeline.onEvent(event);
+  return timeline.text();
 }
 
 }  // namespace quazor

@@ -6,6 +6,7 @@
 
 #include <chrono>
 #include <cstddef>
+#include <memory>
 #include <stdexcept>
 #include <string>
 #include <vector>
@@ -30,8 +31,27 @@ class TimelineTooLarge : public std::runtime_error {
 // Time 0 is the beginning of the run. A diagnostic begins at its own date, or where the one before it ends if that is
 // later, as on a simulated phone, whose clock runs ahead of the wall clock. Within a diagnostic the phone's clock
 // counts: a stage begins where the one before it ended. Stages that this clock does not measure have their time by the
-// wall clock. A record whose run did not end has a time line up to its last event. Throws a TimelineTooLarge if the
-// text would be longer than `most` bytes.
+// wall clock. A run that did not end has a time line up to its last event.
+//
+// Thread: one at a time.
+class Timeline final : public RunEventSink {
+ public:
+  explicit Timeline(const TimelinePart& part = {}, std::size_t most = kMaxTimeline);
+  ~Timeline() override;
+
+  // Events after those that do not fit are left out.
+  void onEvent(const RunEvent& event) override;
+
+  // The whole text, after the last event. Throws a TimelineTooLarge if it would be longer than `most` bytes.
+  const std::string& text();
+
+ private:
+  class Writer;
+
+  std::unique_ptr<Writer> writer_;
+};
+
+// The time line of these events.
 std::string timelineText(const std::vector<RunEvent>& events, const TimelinePart& part = {},
                          std::size_t most = kMaxTimeline);
 

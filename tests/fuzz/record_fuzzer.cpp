@@ -23,7 +23,7 @@ void requireReports(const std::filesystem::path& file) {
   const std::optional<std::string> interrupted = run.ended ? run.ended->interrupted : std::nullopt;
   TextContent text;
   text.page = [](const ShownRun& shown) { return reportPage({shown}, {}); };
-  for (const Format format : kFormats) {
+  for (const Format format : kRecordFormats) {
     require(!reportText(format, run.began, run.records, interrupted, text, run.streams).empty() || run.records.empty(),
             "a run can be reported in every format");
   }

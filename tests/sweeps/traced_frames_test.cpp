@@ -1,184 +1,226 @@
-// On every installed simulated phone, the trace has exactly the frames that a user of the cameras sees.
-#include "backends/simulated/scenario/scenario.h"
-#include "backends/simulated/simulated_phone.h"
-#include "host/device/frame_rings.h"
-#include "platform/capture_keys.h"
-#include "platform/pixel_buffer.h"
+// On every installed simulated phone, a record and its page have exactly the frames that a user of the cameras sees.
+#include "host/device/phone.h"
+#include "host/report/page/page.h"
+#include "host/run/event_pipeline.h"
+#include "host/run/traced_run.h"
+#include "host/testing/test_directory.h"
+#include "host/testing/test_events.h"
+#include "tests/support/effort.h"
 #include "tests/support/shipped_scenario.h"
+#include "tests/sweeps/camera_user.h"
+#include "tests/sweeps/frames_told.h"
 
 #include <gtest/gtest.h>
 
 #include <algorithm>
-#include <chrono>
+#include <cmath>
 #include <cstddef>
 #include <cstdint>
 #include <cstdlib>
+#include <iostream>
 #include <iterator>
 #include <map>
 #include <memory>
 #include <optional>
-#include <random>
+#include <sstream>
+#include <stdexcept>
 #include <string>
+#include <utility>
 #include <vector>
 
 namespace quazor {
 namespace {
 
-using namespace std::chrono_literals;
-
-// The variable QUAZOR_SEEDS is for longer runs by hand.
+// The variable QUAZOR_SEEDS is for runs by hand.
 std::uint64_t seedsToTry() {
   const char* const text = std::getenv("QUAZOR_SEEDS");
-  return text == nullptr ? 8 : std::strtoull(text, nullptr, 10);
+  if (text != nullptr) return std::strtoull(text, nullptr, 10);
+  return isThorough() && !kHasSanitizer ? 100 : 3;
 }
 
-// One camera as its user sees it.
-struct SeenStream {
-  std::chrono::nanoseconds started{};
-  std::vector<TracedFrame> frames;
-  std::map<PixelBuffer*, std::size_t> kept;  // buffers that were not handed back, and their frames
-  std::vector<std::uint64_t> held;           // the numbers of the frames whose buffers are in use
+// The phone of a user.
+// Thread: one at a time.
+class PhoneOfUser final : public Phone {
+ public:
+  explicit PhoneOfUser(SimulatedPhone& phone) : phone_(phone) {}
+
+  Platform platform() const override { return phone_.platform(); }
+  std::vector<DeclaredFault> faults() const override { return {}; }
+  std::uint64_t framesDelivered() const override { return phone_.framesDelivered(); }
+  void traceFrames(FrameTrace& trace) override { phone_.traceFrames(trace); }
+
+ private:
+  SimulatedPhone& phone_;
 };
 
-// A user of all cameras of a phone in virtual time. It keeps some buffers for a while or for ever, takes its time with
-// others, and notes what happens with its own clock.
 // Thread: one at a time.
-class CameraUser {
+class UserExperiment final : public QZExperiment {
  public:
-  CameraUser(const Scenario& scenario, std::uint64_t seed) : scenario_(scenario), random_(seed) {
-    scenario_.faults.clear();
-    phone_ = std::make_unique<SimulatedPhone>(scenario_, PhoneTime::kVirtual, seed);
-    clock_ = phone_->platform().clock;
-    clock_->sleep(std::chrono::nanoseconds(seed * 977));
-    origin_ = clock_->now();
-    clock_->sleep(13ns);
-    rings_.begin(origin_);
-    phone_->traceFrames(rings_);
-    seen_.resize(scenario_.cameras.size());
-  }
+  explicit UserExperiment(CameraUser& user) : user_(user) {}
 
-  // Streams twice with all cameras.
-  void stream() {
-    const std::shared_ptr<CapturePlugIn> plugIn = phone_->platform().capture->createPlugIn();
-    device_ = plugIn == nullptr ? nullptr : plugIn->device(nullptr);
-    if (device_ == nullptr) return;
-    streams_ = *device_->streams(nullptr);
-    ASSERT_EQ(streams_.size(), seen_.size());
-    static_cast<void>(device_->requestControlOfStreams(streams_, nullptr));
-    for (std::size_t i = 0; i < streams_.size(); ++i) handle(i);
-    for (const std::chrono::nanoseconds duration : {std::chrono::nanoseconds(500ms), std::chrono::nanoseconds(90ms)}) {
-      for (std::size_t i = 0; i < streams_.size(); ++i) {
-        seen_[i].started = clock_->now() - origin_;
-        static_cast<void>(streams_[i]->start(nullptr));
-      }
-      clock_->sleep(duration);
-      for (const auto& stream : streams_) static_cast<void>(stream->stop(nullptr));
-      clock_->sleep(50ms);  // for frames that come after the stop
-    }
-  }
-
-  std::size_t compare() {
-    std::vector<std::vector<TracedFrame>> traced(seen_.size());
-    FrameDrain drain(rings_);
-    drain.drain(true, [&traced](std::size_t stream, const TracedFrame& frame, std::uint64_t step) {
-      EXPECT_EQ(step, 1U);
-      traced.at(stream).push_back(frame);
-    });
-    EXPECT_EQ(drain.size(), seen_.size());
-    std::size_t frames = 0;
-    for (std::size_t i = 0; i < seen_.size(); ++i) {
-      EXPECT_EQ(drain.nameOf(i), scenario_.cameras[i].id);
-      EXPECT_EQ(traced[i].size(), seen_[i].frames.size());
-      EXPECT_TRUE(traced[i] == seen_[i].frames) << drain.nameOf(i);
-      EXPECT_EQ(drain.takeLost(i), 0U);
-      frames += traced[i].size();
-    }
-    return frames;
+  QZDescription experimentDescription() const override { return QZDescription("Streams."); }
+  std::unique_ptr<QZExperimentResult> run(DiagnosticErrorPtr* /*error*/) override {
+    user_.stream(installedPlatform());
+    return std::make_unique<QZExperimentResult>();
   }
 
  private:
-  void handle(std::size_t index) {
-    const std::string output(capture_key::PrimaryScaler);
-    const auto handler = std::make_shared<PixelBufferHandler>(
-        [this, index](PixelBuffer& buffer, MediaTime time) { take(index, buffer, time); });
-    CaptureStream& stream = *streams_[index];
-    static_cast<void>(stream.setValue(Dictionary{{output, true}}, capture_key::VideoOutputsEnabled, nullptr));
-    static_cast<void>(
-        stream.setValue(Dictionary{{output, Dictionary{{std::string(capture_key::PixelBufferHandler), handler}}}},
-                        capture_key::VideoOutputHandlers, nullptr));
-  }
-
-  std::int64_t now() const { return (clock_->now() - origin_).count(); }
-
-  // The phone says which buffers of the camera are in use; one of them is new.
-  std::int64_t numberOfNewFrame(std::size_t index) {
-    std::vector<std::uint64_t> held;
-    for (const SimulatedPhone::HeldBuffer& one : phone_->buffersHeld()) {
-      if (one.camera == scenario_.cameras[index].id) held.push_back(one.frame);
-    }
-    std::vector<std::uint64_t> added;
-    std::ranges::sort(seen_[index].held);
-    std::ranges::set_difference(held, seen_[index].held, std::back_inserter(added));
-    EXPECT_EQ(added.size(), 1U);
-    seen_[index].held.push_back(added.at(0));
-    return static_cast<std::int64_t>(added.at(0));
-  }
-
-  void forget(SeenStream& seen, std::int64_t number) {
-    seen.held.erase(std::ranges::find(seen.held, static_cast<std::uint64_t>(number)));
-  }
-
-  void take(std::size_t index, PixelBuffer& buffer, MediaTime time) {
-    SeenStream& seen = seen_[index];
-    const std::size_t place = seen.frames.size();
-    EXPECT_EQ(time.timescale, 1'000'000'000);
-    const std::int64_t number = numberOfNewFrame(index);
-    seen.frames.push_back({number, seen.started.count() + time.value, now(), std::nullopt});
-    if (random_() % 8 == 0) clock_->sleep(std::chrono::nanoseconds(random_() % 5'000'000));
-    if (random_() % 6 == 0) {
-      buffer.retain();
-      seen.kept.emplace(&buffer, place);
-      return;
-    }
-    if (random_() % 4 == 0 && !seen.kept.empty()) {
-      const auto [kept, itsPlace] = *seen.kept.begin();
-      seen.kept.erase(seen.kept.begin());
-      seen.frames[itsPlace].returned = now();
-      forget(seen, seen.frames[itsPlace].number);
-      kept->release();
-    }
-    seen.frames[place].returned = now();  // the phone hands it back when this function returns
-    forget(seen, number);
-  }
-
-  Scenario scenario_;
-  std::mt19937_64 random_;
-  FrameRings rings_{0};
-  std::vector<SeenStream> seen_;
-  std::unique_ptr<SimulatedPhone> phone_;
-  std::shared_ptr<Clock> clock_;
-  std::chrono::nanoseconds origin_{};
-  std::shared_ptr<CaptureDevice> device_;
-  CaptureStreams streams_;
+  CameraUser& user_;
 };
+
+// What is left of a run: its record and its page.
+struct Files {
+  std::string record;
+  std::string page;
+};
+
+// Runs an experiment in which the user streams, as the program does.
+Files run(CameraUser& user) {
+  const TestDirectory directory;
+  EventPipelineOptions options;
+  options.record = directory.path() / "record";
+  options.report.format = Format::kHtml;
+  options.report.output = directory.path() / "page";
+  options.report.text.page = [](const ShownRun& shown) { return reportPage({shown}, {}); };
+  std::ostringstream out;
+  std::ostringstream err;
+  Console console{out, err};
+  EventPipeline events(options, console);
+  RunStarted began = runOf({"Streaming"});
+  began.ofExperiments = true;
+  began.traced = true;
+  events.onEvent(began);
+  DiagnosticStarted diagnosticBegan = beginningOf("Streaming");
+  diagnosticBegan.experimentOnly = true;
+  events.onEvent(diagnosticBegan);
+  Diagnostic diagnostic;
+  diagnostic.name = "Streaming";
+  diagnostic.makeExperiment = [&user] { return std::make_shared<UserExperiment>(user); };
+  diagnostic.experimentOnly = true;
+  RunOptions runOptions;
+  runOptions.makePhone = [&user] { return std::make_unique<PhoneOfUser>(user.phone()); };
+  runOptions.trace.isOn = true;
+  runDiagnosticHere(diagnostic, {}, runOptions, events);
+  events.endDiagnostic();
+  events.onEvent(RunEnded{std::nullopt, momentAt(99)});
+  EXPECT_NE(events.exitCode(), ExitCode::kCannotWrite) << err.str();
+  return {directory.read("record"), directory.read("page")};
+}
+
+// A page has six significant digits, and milliseconds with four decimals.
+void expectShown(double shown, double seen) { EXPECT_NEAR(shown, seen, 0.00006 + std::abs(seen) * 6e-6); }
+
+double seconds(std::int64_t nanoseconds) { return static_cast<double>(nanoseconds) / 1e9; }
+
+// The intervals in milliseconds by the time of their end in seconds.
+std::vector<std::pair<double, double>> intervalsOf(const std::vector<TracedFrame>& frames) {
+  std::vector<std::pair<double, double>> intervals;
+  for (std::size_t i = 1; i < frames.size(); ++i) {
+    intervals.emplace_back(seconds(frames[i].captured),
+                           static_cast<double>(frames[i].captured - frames[i - 1].captured) / 1e6);
+  }
+  return intervals;
+}
+
+void compareGaps(const ShownStream& shown, const std::vector<TracedFrame>& frames) {
+  std::size_t gaps = 0;
+  std::int64_t missing = 0;
+  for (std::size_t i = 1; i < frames.size(); ++i) {
+    const std::int64_t more = frames[i].number - frames[i - 1].number - 1;
+    if (more <= 0) continue;
+    if (gaps++ == 0) {
+      EXPECT_EQ(shown.gapAfter, frames[i - 1].number);
+      expectShown(shown.gapAt, seconds(frames[i - 1].captured));
+    }
+    missing += more;
+  }
+  EXPECT_EQ(shown.gaps, gaps);
+  EXPECT_EQ(shown.missing, static_cast<std::uint64_t>(missing));
+}
+
+void comparePlot(const ShownStream& shown, std::vector<std::pair<double, double>> intervals, double least,
+                 double greatest) {
+  std::ranges::stable_sort(intervals, {}, &std::pair<double, double>::first);
+  ASSERT_EQ(shown.curve.size(), intervals.size());
+  const double begin = intervals.front().first;
+  const double end = intervals.back().first;
+  const double axes[] = {greatest, least, begin, end};
+  for (std::size_t i = 0; i < std::size(axes); ++i) expectShown(shown.axes.at(i), axes[i]);
+  for (std::size_t i = 0; i < intervals.size(); ++i) {
+    EXPECT_NEAR(shown.curve[i].first, 70 + 640 * (intervals[i].first - begin) / (end - begin), 0.06);
+    const double height = greatest > least ? (intervals[i].second - least) / (greatest - least) : 0.5;
+    EXPECT_NEAR(shown.curve[i].second, 118 - 110 * height, 0.06);
+  }
+}
+
+void comparePage(const ShownStream& shown, const std::vector<TracedFrame>& frames) {
+  EXPECT_EQ(shown.frames, frames.size());
+  EXPECT_EQ(shown.lost, 0U);
+  compareGaps(shown, frames);
+  const std::vector<std::pair<double, double>> intervals = intervalsOf(frames);
+  ASSERT_EQ(shown.interval.size(), intervals.empty() ? 0U : 3U);
+  ASSERT_EQ(shown.captured.size(), intervals.empty() ? 0U : 2U);
+  if (intervals.empty()) return;
+  expectShown(shown.captured[0], seconds(frames.front().captured));
+  expectShown(shown.captured[1], seconds(frames.back().captured));
+  std::vector<double> sorted;
+  for (const auto& interval : intervals) sorted.push_back(interval.second);
+  std::ranges::sort(sorted);
+  expectShown(shown.interval[0], sorted[sorted.size() / 2]);
+  expectShown(shown.interval[1], sorted.front());
+  expectShown(shown.interval[2], sorted.back());
+  if (intervals.size() > 1) comparePlot(shown, intervals, sorted.front(), sorted.back());
+}
+
+// What the seeds have in common, and a test that sees nothing else would prove little.
+struct Seen {
+  std::size_t frames = 0;
+  std::size_t notReturned = 0;
+  std::size_t streamsWithGaps = 0;
+  std::size_t streamsWithout = 0;  // without frames
+};
+
+void compare(const CameraUser& user, const Files& files, Seen& all) {
+  std::map<std::string, std::vector<TracedFrame>> told = framesInColumns(files.record);
+  for (const SeenStream& stream : user.seen()) {
+    EXPECT_TRUE(told[stream.name] == stream.frames)
+        << stream.name << ": " << told[stream.name].size() << " frames are told of " << stream.frames.size();
+    all.frames += stream.frames.size();
+    for (const TracedFrame& frame : stream.frames) all.notReturned += frame.returned ? 0 : 1;
+    if (stream.frames.empty()) {
+      ++all.streamsWithout;
+      EXPECT_THROW(streamOnPage(files.page, stream.name), std::out_of_range);
+      continue;
+    }
+    const ShownStream shown = streamOnPage(files.page, stream.name);
+    comparePage(shown, stream.frames);
+    all.streamsWithGaps += shown.gaps > 0 ? 1 : 0;
+  }
+  EXPECT_EQ(told.size(), user.seen().size());
+}
 
 TEST(TracedFramesTest, AreThoseThatAUserSeesOnEveryPhone) {
   const std::uint64_t seeds = seedsToTry();
   ASSERT_GT(seeds, 0U);
   std::size_t phones = 0;
-  std::size_t frames = 0;
+  Seen all;
   for (const std::string& name : shippedScenarios()) {
     const Scenario scenario = shippedScenario(name);
     ++phones;
     for (std::uint64_t seed = 0; seed < seeds; ++seed) {
       CameraUser user(scenario, seed);
-      user.stream();
-      frames += user.compare();
+      compare(user, run(user), all);
       ASSERT_FALSE(testing::Test::HasFailure()) << name << ", seed " << seed;
     }
   }
+  std::cout << phones << " phones with " << seeds << " seeds: " << all.frames << " frames, " << all.notReturned
+            << " of them not returned; " << all.streamsWithGaps << " streams with gaps, " << all.streamsWithout
+            << " without frames\n";
   EXPECT_GT(phones, 150U);
-  EXPECT_GT(frames, 10 * phones * seeds);
+  EXPECT_GT(all.frames, 10 * phones * seeds);
+  EXPECT_GT(all.notReturned, phones);
+  EXPECT_GT(all.streamsWithGaps, seeds);
+  EXPECT_GT(all.streamsWithout, 0U);
 }
 
 }  // namespace
