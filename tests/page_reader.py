@@ -172,17 +172,23 @@ class Page:
             raise ValueError("the page runs or loads something")
         self.verdict = document.first("span", "word").text
         heading = document.first("h1")
-        self.summary = heading.text[len(self.verdict):]
+        self.summary = heading.first("span", "sentence").text
+        self.device = heading.first("span", "device").text
         self.stop = document.first("p", "stop")
         self.records = [read_section(one) for one in document.all("section", "diagnostic")]
         self.facts = [(row[0].text, row[1].text) for row in table(document, "What was run, .*")]
         self.never = [row.children[0].text for row in document.all("tr", "never")]
 
 
+def kind_of_phone(phone):
+    return "Linux binding" if phone.startswith("linux:") else "simulated phone" if phone else "unknown phone"
+
+
 def facts_of(run):
     """The rows of the table about a run that every run has."""
     rows = [("Analysis" if "analyzed" in run else "Run", run["id"]), ("Date", run["date"]), ("Phone", run["phone"]),
-            ("Seed", str(run["seed"])), ("Program", f"quazor {run['program']}"),
+            ("Seed", str(run["seed"])),
+            ("Kind of phone", kind_of_phone(run["phone"])), ("Program", f"quazor {run['program']}"),
             *(("Plug-in", one) for one in run["plugins"]), *((f"Tag {key}", one) for key, one in run["tags"].items())]
     return {(name, printable(text)) for name, text in in_page(rows)}
 
@@ -193,6 +199,8 @@ def compare(comparison, name, content, run, of_experiments, records, due, interr
     word = {"pass": "DONE" if of_experiments else "PASS"}.get(due, due.upper())
     comparison.check(f"{name} html: verdict", page.verdict, word)
     comparison.check(f"{name} html: summary", page.summary, summary)
+    device = kind_of_phone(run["phone"])
+    comparison.check(f"{name} html: device", page.device.partition(":")[0], device)
     comparison.check(f"{name} html: end", page.stop is not None, interrupted is not None)
     missing = set(blurred(sorted(facts_of(run)))) - set(blurred(page.facts))
     comparison.check(f"{name} html: facts", missing, set())

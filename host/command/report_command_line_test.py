@@ -1,10 +1,14 @@
 """The page and the time line of a record: quazor report."""
 
+import html
 import json
 import os
+import re
+import shlex
+import subprocess
 import unittest
 
-from command_line_fixture import SCENARIO, RecordTest, events_in, quazor
+from command_line_fixture import PROGRAM, SCENARIO, RecordTest, events_in, quazor
 
 
 def timeline_of(path):
@@ -229,6 +233,55 @@ class PageTest(RecordTest):
                 result = quazor(*arguments)
                 self.assertEqual(result.returncode, code, result.stderr)
                 self.assertIn(text, result.stderr)
+
+
+class RerunTest(RecordTest):
+    """The commands of a page repeat its run."""
+
+    def commands_of(self, page):
+        shown = re.search('<pre class="command">(.*?)</pre>', page.read_text(), re.DOTALL)
+        return re.findall(r"(?:.*\\\n)*.*[^\\]\n", html.unescape(shown[1]))
+
+    def repeat(self, command, record):
+        """Runs a command as a shell reads it."""
+        folder = self.directory / "bin"
+        folder.mkdir(exist_ok=True)
+        program = folder / "quazor"
+        if not program.exists():
+            program.symlink_to(PROGRAM)
+        path = f"{folder}:{os.environ['PATH']}"
+        return subprocess.run(["sh", "-c", f"{command.rstrip()} --record {shlex.quote(str(record))}"], text=True,
+                              capture_output=True, timeout=120, env={**os.environ, "PATH": path}, cwd=self.directory)
+
+    def test_the_results_are_the_same(self):
+        profile = self.directory / "my limits.json"
+        profile.write_text(json.dumps({"schema": 1, "base": "strict", "diagnostics": {
+            "SingleCameraDiagnostic": {"experiment": {"camera": 1, "duration": 2},
+                                       "limits": [{"limit": "Frames in [10, 59] frames", "name": "it's few"}]}}}))
+        cases = (["--profile", "strict", "--phone", "camera_sync/frames_dropped", "--seed", "3"],
+                 ["--profile", profile, "--limit", "*.Total >= 80", "--tag", "name=a 'b' $HOME"],
+                 ["--phone", "camera_sync/frames_dropped", "--skip", "Tessel*=no 'lab' $0", "--repeat", "2"],
+                 ["--set", "duration=4", "--limit", "*.NoSuch >= 80"])
+        for place, case in enumerate(cases):
+            with self.subTest(case=case):
+                record = self.directory / f"{place}.jsonl"
+                page = self.directory / f"{place}.html"
+                first = quazor("run", "--all", *case, "--record", record, "--output", f"html:{page}")
+                self.assertIn(first.returncode, (0, 1, 2), first.stderr)
+                repeated = []
+                for number, command in enumerate(self.commands_of(page)):
+                    again = self.directory / f"{place}.{number}.jsonl"
+                    result = self.repeat(command, again)
+                    self.assertIn(result.returncode, (0, 1, 2), result.stderr)
+                    names = [event["name"] for event in events_in(again) if event["event"] == "diagnosticBegan"]
+                    repeated += names
+                    lines = quazor("diff", record, again).stdout.splitlines()
+                    # What another of the commands runs is not in this one.
+                    self.assertEqual([line for line in lines if not line.endswith(" is only in the first")
+                                      and line != "The records do not differ."], [])
+                    self.assertFalse([line for line in lines if any(line.startswith(f"{name} ") for name in names)])
+                self.assertEqual(set(repeated), {event["name"] for event in events_in(record)
+                                                 if event["event"] == "diagnosticBegan"})
 
 
 if __name__ == "__main__":

@@ -8,9 +8,9 @@
 #include "host/record/value_json.h"
 #include "host/report/json_report.h"
 #include "host/report/ocp_stream.h"
+#include "host/report/rerun_command.h"
 #include "host/report/run_identity.h"
 #include "host/report/text_report.h"
-#include "host/text/shell_word.h"
 #include "host/text/timestamp.h"
 
 #include <algorithm>
@@ -36,29 +36,12 @@ void addText(Json& json, const char* key, const std::string& text) {
   if (!text.empty()) json[key] = text;
 }
 
-// Appends `before`, which includes blanks, and the quoted word.
-void addWord(std::string& line, std::string_view before, const std::string& word) {
-  line += before;
-  line += shellWord(word);
-}
-
-void addSettings(std::string& line, std::string_view part, const std::vector<ResolvedParameter>& parameters) {
-  for (const ResolvedParameter& one : parameters) {
-    if (one.value) addWord(line, " --set ", formatMessage("%@.%@=%@", part, one.name, *one.value));
-  }
-}
-
 // The command that repeats exactly this run.
 std::string commandOf(const RunStarted& run, const std::vector<std::string>& names,
                       const ResolvedParameters& parameters) {
-  std::string line = run.ofExperiments ? "quazor experiment" : "quazor run";
-  for (const std::string& name : names) addWord(line, " ", name);
-  for (const std::string& plugin : run.plugins) addWord(line, " --plugin ", plugin);
-  if (!run.phone.empty()) addWord(line, " --phone ", run.phone);
-  if (!bindingNamed(run.phone)) line += " --seed " + std::to_string(run.seed);  // no effect on a real phone
-  line += " --profile none";
-  addSettings(line, "experiment", parameters.experiment);
-  addSettings(line, "analysis", parameters.analysis);
+  std::string line;
+  for (const std::string& part : commandParts(run, names, run.seed)) line += (line.empty() ? "" : " ") + part;
+  for (const std::string& part : settingParts(parameters)) line += " " + part;
   return line;
 }
 
@@ -66,15 +49,13 @@ std::string commandOf(const RunStarted& run, const std::vector<std::string>& nam
 // limit without a result repeats the whole run with that limit.
 std::string commandOf(const RunStarted& run, const DiagnosticRecord& record) {
   if (isOfLimit(record)) {
-    std::string line = commandOf(run, run.names, {});
-    addWord(line, " --limit ", record.name);
-    return line;
+    return commandOf(run, run.names, {}) + " " + optionPart("--limit", record.name);
   }
   std::string line = commandOf(run, {record.name}, record.parameters);
   std::set<std::string> limits;
   for (const LimitCheck& check : limitChecksOf(record)) {
     const std::string text = canonicalText(check.limit);
-    if (check.counts() && limits.insert(text).second) addWord(line, " --limit ", text);
+    if (check.counts() && limits.insert(text).second) line += " " + optionPart("--limit", text);
   }
   return line;
 }

@@ -1,6 +1,7 @@
 #include "host/report/run_identity.h"
 
 #include "contract/message_format.h"
+#include "host/device/phone.h"
 #include "host/report/csv_report.h"
 #include "host/text/table.h"
 #include "host/text/timestamp.h"
@@ -119,6 +120,11 @@ std::string withRunColumns(const std::string& csv, const RunStarted& run, const 
     table += unit;
   }
   return table;
+}
+
+std::string phoneKind(const RunStarted& run) {
+  if (run.phone.empty()) return "unknown phone";
+  return bindingNamed(run.phone) ? "Linux binding" : std::string(kSimulatedPhone);
 }
 
 std::string serialNumberOf(const RunStarted& run) {

@@ -8,6 +8,7 @@
 #include <cstdint>
 #include <ostream>
 #include <string>
+#include <string_view>
 #include <vector>
 
 namespace quazor {
@@ -25,6 +26,11 @@ std::string interruptionText(const RunStarted& run, const std::string& interrupt
 // Appends columns for the run to every line of a CSV table. The seed of a line is that of its own entry, `seeds`, which
 // has one for each line after the header.
 std::string withRunColumns(const std::string& csv, const RunStarted& run, const std::vector<std::uint64_t>& seeds);
+
+inline constexpr std::string_view kSimulatedPhone = "simulated phone";
+
+// kSimulatedPhone or, if the phone was this machine, "Linux binding"; "unknown phone" if the record names none.
+std::string phoneKind(const RunStarted& run);
 
 // The serial number of the phone: the tag "serial"; empty if there is none.
 std::string serialNumberOf(const RunStarted& run);

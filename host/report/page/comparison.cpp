@@ -81,8 +81,9 @@ std::string comparisonPage(const ComparedRecord& before, const ComparedRecord& a
   const bool isSame = differences.empty();
   const std::string sentence =
       isSame ? "The records do not differ" : "The records differ in " + countText(differences.size(), "place");
-  std::string body = bannerOf(isSame ? "pass" : "skip", isSame ? "SAME" : "DIFFERENT", sentence,
-                              htmlName(before.file) + " and " + htmlName(after.file));
+  std::string body =
+      bannerOf(isSame ? "pass" : "skip", isSame ? "SAME" : "DIFFERENT", deviceText({before.run.began, after.run.began}),
+               sentence, htmlName(before.file) + " and " + htmlName(after.file));
   body +=
       "<main>\n<h2>The runs</h2>\n<div class=\"scroll\" tabindex=\"0\" role=\"region\" aria-label=\"Runs\">"
       "<table class=\"runs\"><caption>The two runs</caption><thead><tr><th scope=\"col\">Run</th>"

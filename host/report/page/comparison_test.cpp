@@ -42,7 +42,7 @@ TEST(ComparisonPage, HasBothValuesOfWhatDiffers) {
 TEST(ComparisonPage, SaysThatNothingDiffers) {
   const RecordedRun run = runWith({recordOf("A", Verdict::kPass)}, 33'000'000);
   const std::string page = comparisonPage({run, "a.jsonl"}, {run, "a.jsonl"}, true);
-  EXPECT_THAT(page, HasSubstr("<span class=\"word\">SAME</span>The records do not differ"));
+  EXPECT_THAT(page, HasSubstr("<span class=\"sentence\">The records do not differ"));
   EXPECT_THAT(page, Not(HasSubstr("What differs")));
 }
 

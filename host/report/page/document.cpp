@@ -16,9 +16,12 @@ std::string policy() {
 
 }  // namespace
 
-std::string bannerOf(const std::string& kind, const std::string& word, const std::string& sentence,
-                     const std::string& facts) {
-  return "<header class=\"" + kind + "\"><div>" + element("h1", element("span class=\"word\"", word) + sentence) +
+std::string bannerOf(const std::string& kind, const std::string& word, const std::string& device,
+                     const std::string& sentence, const std::string& facts) {
+  return "<header class=\"" + kind + "\"><div>" +
+         element("h1", element("span class=\"word\"", word) +
+                           (device.empty() ? device : " " + element("span class=\"device\"", device)) +
+                           element("span class=\"sentence\"", sentence)) +
          element("p", facts) + "</div></header>\n";
 }
 

@@ -7,6 +7,7 @@
 #include "host/report/page/results_table.h"
 #include "host/report/page/run_facts.h"
 #include "host/report/page/run_section.h"
+#include "host/report/run_identity.h"
 #include "host/text/table.h"
 
 #include <algorithm>
@@ -36,9 +37,9 @@ std::string runsTable(const std::vector<ShownRun>& runs) {
     rows += element("tr", element("th scope=\"row\"", "<a href=\"#run" + std::to_string(i + 1) + "\">Run " +
                                                           std::to_string(i + 1) + "</a>") +
                               element("td", verdictBadge(verdict.kind)) + element("td", htmlText(summaryOf(runs[i]))) +
-                              element("td", htmlName(shortPhone(run))) + element("td", tags) +
-                              element("td", dateText(run.date)) + element("td", htmlName(run.host)) +
-                              element("td", htmlText(runs[i].file))) +
+                              element("td", htmlName(shortPhone(run)) + element("small", phoneKind(run))) +
+                              element("td", tags) + element("td", dateText(run.date)) +
+                              element("td", htmlName(run.host)) + element("td", htmlText(runs[i].file))) +
             "\n";
   }
   return "<table class=\"runs\"><caption>The runs of this page</caption><thead><tr><th scope=\"col\">Run</th>"
@@ -50,15 +51,18 @@ std::string runsTable(const std::vector<ShownRun>& runs) {
 
 std::string pageOfOne(const ShownRun& run, const PageOptions& options) {
   const PageVerdict verdict = verdictOf(run);
-  return document(verdict.word + ": " + htmlName(shortPhone(run.began)),
-                  bannerOf(verdict.kind, verdict.word, htmlText(summaryOf(run)), factsOf(run.began)) +
-                      element("main", "\n" + runSections(run, 1, 2, options)) + "\n" + footerOf(run.began));
+  return document(
+      verdict.word + ": " + htmlName(shortPhone(run.began)),
+      bannerOf(verdict.kind, verdict.word, deviceText({run.began}), htmlText(summaryOf(run)), factsOf(run.began)) +
+          element("main", "\n" + runSections(run, 1, 2, options)) + "\n" + footerOf(run.began));
 }
 
 std::string pageOfMany(const std::vector<ShownRun>& runs, const PageOptions& options) {
   std::size_t passed = 0;
   PageVerdict worst = verdictOf(runs.front());
   std::string sections;
+  std::vector<RunStarted> began;
+  for (const ShownRun& run : runs) began.push_back(run.began);
   for (std::size_t i = 0; i < runs.size(); ++i) {
     const PageVerdict verdict = verdictOf(runs[i]);
     passed += verdict.kind == "pass" ? 1 : 0;
@@ -72,13 +76,14 @@ std::string pageOfMany(const std::vector<ShownRun>& runs, const PageOptions& opt
   }
   const std::string sentence = countText(runs.size(), "run") + ": " + std::to_string(passed) + " passed, " +
                                std::to_string(runs.size() - passed) + " did not";
-  return document(worst.word + ": " + countText(runs.size(), "run"),
-                  bannerOf(worst.kind, worst.word, sentence, "The verdict is that of the worst run.") +
-                      element("main",
-                              "\n<h2>Runs</h2>\n<div class=\"scroll\" tabindex=\"0\" role=\"region\" "
-                              "aria-label=\"Table of runs\">" +
-                                  runsTable(runs) + "</div>\n" + sections) +
-                      "\n" + footerOf(runs.front().began));
+  return document(
+      worst.word + ": " + countText(runs.size(), "run"),
+      bannerOf(worst.kind, worst.word, deviceText(began), sentence, "The verdict is that of the worst run.") +
+          element("main",
+                  "\n<h2>Runs</h2>\n<div class=\"scroll\" tabindex=\"0\" role=\"region\" "
+                  "aria-label=\"Table of runs\">" +
+                      runsTable(runs) + "</div>\n" + sections) +
+          "\n" + footerOf(runs.front().began));
 }
 
 }  // namespace

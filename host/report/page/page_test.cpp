@@ -37,9 +37,12 @@ std::size_t countOf(const std::string& text, const std::string& part) {
 
 TEST(ReportPage, SaysTheVerdictFirst) {
   const std::string page = SampleRun({recordOf("A", Verdict::kPass), recordOf("B", Verdict::kFail)}).page();
-  EXPECT_THAT(page,
-              HasSubstr("<body>\n<header class=\"fail\"><div><h1><span class=\"word\">FAIL</span>2 diagnostics: 1 "
-                        "passed, 1 failed, 0 ended in an error</h1>"));
+  EXPECT_THAT(
+      page,
+      HasSubstr(
+          "<body>\n<header class=\"fail\"><div><h1><span class=\"word\">FAIL</span> <span class=\"device\">simulated "
+          "phone: no hardware was tested</span><span class=\"sentence\">2 diagnostics: 1 passed, 1 "
+          "failed, 0 ended in an error</span></h1>"));
   EXPECT_THAT(page, HasSubstr("<title>FAIL: phone</title>"));
 }
 
@@ -74,10 +77,10 @@ TEST(ReportPage, HasEveryPartOfADiagnostic) {
   run.records[0].stages = {{Stage::kRun, Date(), Date() + std::chrono::seconds(1)}, {Stage::kTeardown, Date(), {}}};
   run.streams = {{{"wide", {{0, 0, 0, {}}, {1, 33'000'000, 33'000'000, {}}}, 0}}};
   const std::string page = run.page();
-  for (const char* part : {"Domain code -1", "it failed", "caused by ", "the cause", "<th scope=\"row\">Count</th>",
-                           "command line", "not set", "<th scope=\"row\">Raw</th>", "<th scope=\"row\">bytes</th>",
-                           "a line", "CaptureStream.start", "Seed 7", "Stream wide", "did not end", "p.so",
-                           "phone.json", "quazor run A --phone phone.json --seed 5 --set experiment.duration=3\n"}) {
+  for (const char* part :
+       {"Domain code -1", "it failed", "caused by ", "the cause", "<th scope=\"row\">Count</th>", "command line",
+        "not set", "<th scope=\"row\">Raw</th>", "<th scope=\"row\">bytes</th>", "a line", "CaptureStream.start",
+        "Seed 7", "Stream wide", "did not end", "p.so", "phone.json", "quazor run A \\\n  --plugin p.so"}) {
     EXPECT_THAT(page, HasSubstr(part)) << part;
   }
 }
@@ -114,8 +117,7 @@ TEST(ReportPage, OfSeveralRunsHasATableFirst) {
   ShownRun second = bad.shown();
   second.file = "bad.jsonl";
   const std::string page = reportPage({good.shown(), second}, {});
-  EXPECT_THAT(page, HasSubstr("<header class=\"fail\"><div><h1><span class=\"word\">FAIL</span>2 runs: 1 passed, 1 did "
-                              "not</h1>"));
+  EXPECT_THAT(page, HasSubstr("<span class=\"sentence\">2 runs: 1 passed, 1 did not</span></h1>"));
   EXPECT_LT(page.find("The runs of this page"), page.find("<section id=\"run1\""));
   EXPECT_THAT(page, HasSubstr("<td>bad.jsonl</td>"));
   EXPECT_THAT(page, HasSubstr("id=\"run2-1\""));
@@ -173,18 +175,23 @@ TEST(ReportPage, TakesANameOfAnyLength) {
   EXPECT_LT(page.size(), 500'000U);
 }
 
-TEST(RerunCommand, IsOnePerDiagnosticIfTheirValuesDiffer) {
-  SampleRun run({recordOf("A", Verdict::kPass), recordOf("B", Verdict::kPass)});
-  run.records[1].parameters.experiment[0].value = Value(4);
-  EXPECT_THAT(run.page(), HasSubstr("quazor run A --phone phone.json --seed 5 --set experiment.duration=3\n"
-                                    "quazor run B --phone phone.json --seed 5 --set experiment.duration=4\n"));
+TEST(ReportPage, SaysWhatKindOfPhoneItWas) {
+  SampleRun run({recordOf("A", Verdict::kPass)});
+  run.began.phone = "linux:board.json";
+  EXPECT_THAT(run.page(), HasSubstr("PASS</span> <span class=\"device\">Linux binding</span>"));
+  const SampleRun other({recordOf("A", Verdict::kPass)});
+  const std::string both = reportPage({run.shown(), other.shown()}, {});
+  EXPECT_THAT(both, Not(HasSubstr("class=\"device\"")));
+  EXPECT_THAT(both, HasSubstr("board<small>Linux binding</small>"));
+  EXPECT_THAT(both, HasSubstr("phone<small>simulated phone</small>"));
 }
 
-TEST(RerunCommand, HasNoSettingsOfTheDefaultProfile) {
+// Counters use no frames, and some diagnostics have the device count them.
+TEST(ReportPage, SaysNothingOfFramesThatNobodyAskedFor) {
   SampleRun run({recordOf("A", Verdict::kPass)});
-  run.records[0].parameters.experiment[0].source = "profile default.json";
-  run.began.tags.set("serial", "C 1");
-  EXPECT_THAT(run.page(), HasSubstr("<pre>quazor run A --phone phone.json --seed 5 --tag 'serial=C 1'\n</pre>"));
+  run.began.traced = true;
+  run.streams = {{}};
+  EXPECT_THAT(run.page(), Not(HasSubstr("No frame")));
 }
 
 }  // namespace

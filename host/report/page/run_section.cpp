@@ -9,6 +9,7 @@
 #include "host/report/page/html.h"
 #include "host/report/page/results_table.h"
 #include "host/report/page/run_facts.h"
+#include "host/report/rerun_command.h"
 #include "host/report/run_identity.h"
 #include "host/report/short_report.h"
 #include "host/report/variation_report.h"
@@ -173,13 +174,9 @@ std::string scrolling(const std::string& label, const std::string& table) {
 }
 
 std::string framesOf(const ShownRun& run, std::size_t number, std::size_t index, int level) {
-  const DiagnosticRecord& record = run.records[index];
   const std::string frames =
       index < run.streams.size() ? framesSection(run.streams[index], level, true) : std::string();
-  if (!frames.empty() || !run.began.traced || record.skip) {
-    return scrolling("Frames of " + entryText(run, number, index), frames);
-  }
-  return element("p class=\"soft\"", "No frame was delivered to this diagnostic, so there is no plot of frames.");
+  return scrolling("Frames of " + entryText(run, number, index), frames);
 }
 
 std::string diagnosticSection(const ShownRun& run, std::size_t number, std::size_t index, int level,
@@ -221,6 +218,22 @@ std::string stopLine(const ShownRun& run) {
   return element("p class=\"stop\"", htmlText(text) + ".") + "\n";
 }
 
+// How to run it again, and what that leaves out.
+std::string rerunSection(const ShownRun& run, int level) {
+  const std::string commands = rerunCommands(run);
+  if (commands.empty()) return {};
+  std::string text =
+      "Each line that ends in a backslash goes on in the next. The values are those of this run, so no profile is "
+      "read.";
+  if (std::ranges::count(commands, '\n') > std::ranges::count(commands, '\\') + 1) {
+    text += " A value is set for all diagnostics of a command, so those with other values have a command of their own.";
+  }
+  const auto warns = [](const UserLimit& limit) { return limit.severity == LimitSeverity::kWarn; };
+  if (std::ranges::any_of(run.began.limits, warns)) text += " Limits that only warn are left out.";
+  return heading(level, "To run it again") + element("p class=\"soft\"", text) +
+         element("pre class=\"command\"", htmlLines(commands));
+}
+
 }  // namespace
 
 PageVerdict verdictOf(const ShownRun& run) {
@@ -250,10 +263,7 @@ std::string runSections(const ShownRun& run, std::size_t number, int level, cons
   html += variationOf(run);
   for (std::size_t i = 0; i < run.records.size(); ++i) html += diagnosticSection(run, number, i, level, options);
   html += heading(level, "The run") + scrolling("Facts about run " + std::to_string(number), runTable(run));
-  html += heading(level + 1, "To run it again") +
-          element("p", "With the plug-ins named above and the default profile:") +
-          element("pre", htmlLines(rerunCommands(run)));
-  return html;
+  return html + rerunSection(run, level + 1);
 }
 
 }  // namespace quazor

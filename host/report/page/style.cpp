@@ -18,8 +18,9 @@ header{max-width:none;padding:0;color:#fff;background:#45525f}
 header>div{max-width:72rem;margin:0 auto;padding:1.25rem}
 header.pass{background:#0b6b2e}header.fail{background:#a3131f}header.error{background:#8a4b00}
 h1,h2,h3,h4,h5,h6{line-height:1.25;margin:1.6rem 0 .6rem;font-weight:650}
-h1{font-size:1.3rem;margin:.2rem 0;font-weight:600}h1 .word{display:block;font-size:3.2rem;line-height:1.1;
-font-weight:750;letter-spacing:.02em}
+h1{font-size:1.3rem;margin:.2rem 0;font-weight:600}h1 .word{font-size:3.2rem;line-height:1.1;
+font-weight:750;letter-spacing:.02em;margin-right:.6rem}h1 .sentence{display:block}
+.device{display:inline-block;border:2px solid;border-radius:4px;padding:.1rem .6rem;font-size:1.1rem;vertical-align:.6rem}
 h2{font-size:1.45rem}h3{font-size:1.2rem}h4{font-size:1.05rem}h5,h6{font-size:1rem}
 p{margin:.5rem 0}header p{margin:.1rem 0}
 a{color:var(--link)}
@@ -83,7 +84,7 @@ details{padding:0 .7rem}tbody th{min-width:9rem}svg.plot,svg.stages{min-width:56
 --pass:#000;--passground:#fff;--fail:#000;--failground:#fff;--error:#000;--errorground:#fff;--skip:#000;
 --skipground:#fff;--curve:#000;--second:#555;--allowed:#ccc}
 body{font-size:10pt}header,header.pass,header.fail,header.error{color:#000;background:#fff;border-bottom:2pt solid #000}
-details{border:0;padding:0}details::details-content{content-visibility:visible;block-size:auto}
+details,details[open]{border:0;padding:0}details::details-content{content-visibility:visible;block-size:auto}
 .badge{border:1px solid #000}.filter{display:none}.whole{max-height:none}
 .log tr:is(.debug,.default,.error){display:table-row!important}
 tr,figure,.finding{break-inside:avoid}thead{display:table-header-group}h2,h3,h4{break-after:avoid}
