@@ -151,6 +151,8 @@ def text_end(records, of_experiments, interrupted, run, never_began):
         yield counts_line(records, of_experiments, never_began)
     if any(outcome_of(one) == "flaky" for one in last_attempts(records)) and not run.get("acceptFlaky"):
         yield "A pass after an error counts as an error, unless --accept-flaky is given."
+    if any(outcome_of(one) == "fail" and (one["attempt"] or 1) > 1 for one in last_attempts(records)) and not run.get("acceptFlaky"):
+        yield "A failure after an error counts as an error, unless --accept-flaky is given."
     if not of_experiments:
         yield from failure_lines(records)
     if interrupted is None and run_verdict(records, run.get("acceptFlaky")) == "skip":

@@ -166,6 +166,16 @@ class AttemptsTest(RecordTest):
         self.assertIn("\n  PASS\n    pass in attempt 2 of 3\n", done.stdout)
         self.assertNotIn("counts as an error", done.stdout)
 
+    def test_the_text_says_why_a_failure_after_an_error_exits_with_2(self):
+        failure = "A failure after an error counts as an error, unless --accept-flaky is given.\n"
+        done = self.run_script("efp", "--attempts", "3")
+        self.assertEqual(done.returncode, 2)
+        self.assertIn(failure, done.stdout)
+        done = self.run_script("efp", "--attempts", "3", "--accept-flaky")
+        self.assertEqual(done.returncode, 1)
+        self.assertNotIn("counts as an error", done.stdout)
+        self.assertNotIn("counts as an error", self.run_script("fp", "--attempts", "3").stdout)
+
     def test_what_varied(self):
         done = self.run_script("ppfpepfp", "--repeat", "4", "--output", f"json:{self.output}")
         self.assertIn("What varied between the repetitions (#: the first repetition with that value; Outlier: the one "

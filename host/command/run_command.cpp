@@ -279,16 +279,13 @@ ResolvedParameters reboundParameters(const DiagnosticRecord& record, const Resol
   return parameters;
 }
 
-// The limits of the record. One whose diagnostics were skipped or ended in an error there is not missed in the
-// analysis, as it was not in the run.
+// The limits of the record. One that was not missed in the run, for example because its diagnostic ended in an error, is
+// not missed in the analysis.
 std::vector<UserLimit> limitsToAnalyze(const RecordedRun& run) {
   std::vector<UserLimit> limits = run.began.limits;
   for (UserLimit& limit : limits) {
     if (limit.diagnostic.empty()) continue;
-    const bool isMeant = std::any_of(run.records.begin(), run.records.end(), [&limit](const DiagnosticRecord& one) {
-      return !isOfLimit(one) && appliesTo(limit, one.name);
-    });
-    limit.onlyIfSelected = limit.onlyIfSelected || isMeant;
+    limit.onlyIfSelected = limit.onlyIfSelected || limitsWithoutResult({limit}, run.records).empty();
   }
   return limits;
 }

@@ -79,18 +79,6 @@ void addChosenProfile(const std::filesystem::path& name, const Installation& ins
   addProfile(file, file == name, installation, profiles);
 }
 
-// Refuses a limit of the command line for a diagnostic that does not exist, before anything runs.
-void refuseLimitsOfUnknown(const std::vector<UserLimit>& limits, const std::vector<Diagnostic>& catalogue) {
-  for (const UserLimit& limit : limits) {
-    const bool isKnown = std::any_of(catalogue.begin(), catalogue.end(),
-                                     [&limit](const Diagnostic& one) { return appliesTo(limit, one.name); });
-    if (isKnown) continue;
-    throw CommandError(ExitCode::kUsage,
-                       formatMessage("--limit '%@': no diagnostic has the name '%@'%@", canonicalText(limit),
-                                     limit.diagnostic, didYouMeanOrPattern(limit.diagnostic, namesOf(catalogue))));
-  }
-}
-
 // Refuses a wrong profile, and says what to do if only an entry for what is not loaded is wrong.
 void checkProfileToRun(const Profile& profile, const std::vector<DescribedDiagnostic>& catalogue) {
   try {
@@ -242,8 +230,6 @@ Selection select(const Options& options, const Installation& installation, Watch
   for (const DescribedDiagnostic& one : described) catalogue.push_back(one.diagnostic);
 
   const std::vector<Diagnostic> wanted = wantedWithWayOut(catalogue, options, installation, !scan.failed.empty());
-  // A plug-in that could not be loaded may have the diagnostic.
-  if (scan.failed.empty()) refuseLimitsOfUnknown(options.limits, allOf(catalogue, Wanted::kDiagnostics));
   std::vector<Profile> profiles = profilesOf(options, installation);
   describeForProfiles(options, installation, profiles, described, signals);
   addExplainedRanges(installation.explanations(), described);

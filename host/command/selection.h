@@ -52,7 +52,7 @@ PluginScan scanForSelection(const Options& options, const Installation& installa
 // The selected diagnostics or experiments with their parameters. All checks are done except for required parameters
 // without a value. Only the selected diagnostics are described, unless a profile's entry matches more than those and
 // sets a parameter that none of them declares; then all its matches are described. An unknown name is accepted if a
-// plug-in could not be loaded, because that plug-in may define it. That is true of the diagnostics of limits, too.
+// plug-in could not be loaded, because that plug-in may define it.
 Selection select(const Options& options, const Installation& installation, WatchedSignals* signals = nullptr);
 
 // Tells the limitsForOtherValues() of the profiles.

@@ -32,8 +32,16 @@ class SkipTest(RecordTest):
     def test_a_failure_precedes_a_skip(self):
         self.assertEqual([one for one, _ in self.verdicts(*HOT, "--limit", "Count < 0", code=1)], ["fail", "skip"])
 
-    def test_a_limit_that_only_a_skipped_one_could_meet_is_no_error(self):
-        self.verdicts(*HOT, "--allow-skips", "--limit", "Fake.Two:Count >= 0")
+    def test_a_limit_that_only_a_skipped_one_could_meet_is_an_error(self):
+        limit = "Fake.Two:Count >= 0"
+        done = self.run_fake(*HOT, "--allow-skips", "--limit", limit, names=BOTH)
+        self.assertEqual(done.returncode, 2, done.stderr)
+        self.assertIn(f"the limit '{limit}' (command line) was compared with nothing: every diagnostic for which it is "
+                      "meant was skipped", done.stdout)
+
+    def test_a_limit_of_a_profile_is_not_missed_where_its_diagnostic_is_skipped(self):
+        path = self.profile({"Fake.Two": {"limits": [{"limit": "Count >= 0"}]}})
+        self.verdicts(*HOT, "--allow-skips", "--parameters", path)
 
     def test_a_limit_that_fits_nothing_is_not_excused_by_a_skip(self):
         self.verdicts(*HOT, "--allow-skips", "--limit", "Nothing >= 0", code=2)

@@ -199,7 +199,7 @@ std::vector<UserLimit> limitsWithoutResult(const std::vector<UserLimit>& limits,
         isDecided = isDecided || record.error != nullptr || fitsAny(limit, record);
       }
     }
-    if (isDecided || (wasSkipped && !wasMissed)) continue;
+    if (isDecided || (limit.onlyIfSelected && wasSkipped && !wasMissed)) continue;
     if (isMeant || !limit.onlyIfSelected) without.push_back(limit);
   }
   return without;
@@ -253,16 +253,20 @@ std::string didYouMeanResult(const std::string& asked, const std::vector<std::st
 DiagnosticErrorPtr errorOfLimitWithoutResult(const UserLimit& limit, const std::vector<DiagnosticRecord>& records) {
   std::vector<std::string> names;
   std::vector<std::string> diagnostics;
+  bool isOnlyForSkipped = true;
   for (const DiagnosticRecord& record : records) {
     diagnostics.push_back(record.name);
-    if (!appliesTo(limit, record.name)) continue;
+    if (!appliesTo(limit, record.name) || isOfLimit(record)) continue;
+    isOnlyForSkipped = isOnlyForSkipped && record.skip;
     for (const JudgedResult& one : record.measuredResults) names.push_back(one.result.name());
   }
   const bool isMeant = std::any_of(diagnostics.begin(), diagnostics.end(),
                                    [&limit](const std::string& name) { return appliesTo(limit, name); });
-  std::string why = isMeant ? "no result has the name '" + limit.result + "'" + didYouMeanResult(limit.result, names)
-                            : "no diagnostic was selected that has the name '" + limit.diagnostic + "'" +
-                                  didYouMean(limit.diagnostic, diagnostics);
+  std::string why = !isMeant ? "no diagnostic was selected that has the name '" + limit.diagnostic + "'" +
+                                   didYouMeanOrPattern(limit.diagnostic, diagnostics)
+                    : isOnlyForSkipped
+                        ? std::string("every diagnostic for which it is meant was skipped")
+                        : "no result has the name '" + limit.result + "'" + didYouMeanResult(limit.result, names);
   return hostError(
       HostErrorCode::kLimitWithoutResult,
       formatMessage("the limit '%@' (%@) was compared with nothing: %@", canonicalText(limit), limit.source, why));

@@ -55,8 +55,8 @@ std::vector<LimitCheck> checksOfResult(const std::vector<LimitCheck>& checks, st
 std::optional<QZLimit> boundsOf(const LimitCheck& check);
 
 // The limits that fit no result in any of the records. Not those that are meant for a diagnostic that ended in an
-// error, because the run is one then, nor those that are only meant for diagnostics that were skipped. A limit that is
-// only meant for some diagnostics, none of which was selected, is not one of them if it comes from a profile.
+// error, because the run is one then. A limit of a profile is not one of them if all diagnostics for which it is meant
+// were skipped, or none of them was selected.
 std::vector<UserLimit> limitsWithoutResult(const std::vector<UserLimit>& limits,
                                            const std::vector<DiagnosticRecord>& records);
 

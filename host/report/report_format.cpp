@@ -165,6 +165,16 @@ void printReport(std::ostream& out, const RunStarted& run, const DiagnosticRecor
   }
 }
 
+namespace {
+
+bool hasFailureAfterError(const std::vector<DiagnosticRecord>& records) {
+  return std::any_of(records.begin(), records.end(), [](const DiagnosticRecord& one) {
+    return one.verdict == Verdict::kFail && one.trial.attempt > 1;  // a failure is never tried again
+  });
+}
+
+}  // namespace
+
 void printEnd(std::ostream& out, const RunStarted& run, const std::vector<DiagnosticRecord>& finished,
               const std::optional<std::string>& interrupted, const TextContent& text, bool colour) {
   const bool endsWithRepetition =
@@ -177,9 +187,12 @@ void printEnd(std::ostream& out, const RunStarted& run, const std::vector<Diagno
     const std::size_t notReached = interrupted ? unrecordedDiagnosticsOf(run, records, interrupted).neverRun.size() : 0;
     run.ofExperiments ? printExperimentSummary(out, records, notReached) : printSummary(out, records, notReached);
   }
-  const bool hasFlaky = verdictCountsOf(records).flaky > 0;
-  if (hasFlaky && !run.acceptFlaky)
-    out << "A pass after an error counts as an error, unless --accept-flaky is given.\n";
+  if (!run.acceptFlaky) {
+    if (verdictCountsOf(records).flaky > 0)
+      out << "A pass after an error counts as an error, unless --accept-flaky is given.\n";
+    if (hasFailureAfterError(records))
+      out << "A failure after an error counts as an error, unless --accept-flaky is given.\n";
+  }
   if (!run.ofExperiments) printFailures(out, records, colour, text.isExplained);
   const ExitRules rules{text.allowSkips, run.acceptFlaky};
   if (interrupted || runVerdictOf(records, run.acceptFlaky) != Verdict::kSkip) return;
