@@ -16,8 +16,6 @@ using Json = nlohmann::ordered_json;
 
 namespace {
 
-bool isOfHost(const DiagnosticErrorPtr& error) { return error != nullptr && error->domain() == QuazorHostErrorDomain; }
-
 std::string errorText(const std::optional<ExpectedError>& error) {
   return error ? formatMessage("%@ code %@: %@", error->domain, error->code, error->message) : std::string("no error");
 }
@@ -93,7 +91,7 @@ std::string_view nameOf(SelftestVerdict verdict) {
 
 std::string differenceOf(const ExpectedOutcome& expected, const DiagnosticRecord& record) {
   // The host's own error for a run that reported none says nothing about the phone.
-  const bool hostsWord = isOfHost(record.error) && !expected.error;
+  const bool hostsWord = isHostError(record.error) && !expected.error;
   const DiagnosticErrorPtr error = hostsWord ? nullptr : record.error;
   std::vector<Comparison> comparisons = {
       {"the verdict", expected.verdict, std::string(nameOf(record.verdict))},

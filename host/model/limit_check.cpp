@@ -10,7 +10,6 @@
 
 #include <algorithm>
 #include <cmath>
-#include <cstdint>
 #include <iterator>
 #include <optional>
 #include <sstream>
@@ -206,8 +205,7 @@ std::vector<UserLimit> limitsWithoutResult(const std::vector<UserLimit>& limits,
 }
 
 bool isOfLimit(const DiagnosticRecord& record) {
-  return record.experimentName.empty() && record.error != nullptr && record.error->domain() == QuazorHostErrorDomain &&
-         record.error->code() == static_cast<std::int64_t>(HostErrorCode::kLimitWithoutResult);
+  return record.experimentName.empty() && isHostError(record.error, HostErrorCode::kLimitWithoutResult);
 }
 
 namespace {
