@@ -41,15 +41,10 @@ std::string validateLimit(const QZLimit& limit, const Measurement& measured) {
 }
 
 bool isInside(const QZLimit& limit, double value) {
-  if (const QZBound* lower = limit.lowerBound().get()) {
-    const double low = lower->value().value();
-    if (value < low || (value == low && lower->open())) return false;
-  }
-  if (const QZBound* upper = limit.upperBound().get()) {
-    const double high = upper->value().value();
-    if (value > high || (value == high && upper->open())) return false;
-  }
-  return true;
+  const QZBound* lower = limit.lowerBound().get();
+  const QZBound* upper = limit.upperBound().get();
+  return (lower == nullptr || isInsideLower(value, lower->value().value(), lower->open())) &&
+         (upper == nullptr || isInsideUpper(value, upper->value().value(), upper->open()));
 }
 
 // A limit of the user can only make the verdict stricter.
@@ -81,6 +76,10 @@ std::string_view nameOf(Verdict verdict) {
   }
   return "error";
 }
+
+bool isInsideLower(double value, double bound, bool open) { return open ? value > bound : value >= bound; }
+
+bool isInsideUpper(double value, double bound, bool open) { return open ? value < bound : value <= bound; }
 
 JudgedResult judgeResult(QZMeasuredResult result) {
   const std::optional<QZLimit>& limit = result.limit();

@@ -20,13 +20,13 @@ namespace {
 
 bool holds(LimitOperator comparison, double value, double other, double tolerance) {
   switch (comparison) {
-    case LimitOperator::kLess: return value < other;
-    case LimitOperator::kLessOrEqual: return value <= other;
-    case LimitOperator::kGreater: return value > other;
-    case LimitOperator::kGreaterOrEqual: return value >= other;
+    case LimitOperator::kLess: return isInsideUpper(value, other, true);
+    case LimitOperator::kLessOrEqual: return isInsideUpper(value, other, false);
+    case LimitOperator::kGreater: return isInsideLower(value, other, true);
+    case LimitOperator::kGreaterOrEqual: return isInsideLower(value, other, false);
     case LimitOperator::kEqual: break;
   }
-  return value >= other - tolerance && value <= other + tolerance;
+  return isInsideLower(value, other - tolerance, false) && isInsideUpper(value, other + tolerance, false);
 }
 
 // Performs one comparison, with one overload per kind of condition. They return why it is impossible, or nothing.
@@ -44,8 +44,8 @@ class Comparison {
   std::string operator()(const IntervalCondition& condition) {
     if (std::string problem = validate(condition.unit); !problem.empty()) return problem;
     const double value = measured_.value();
-    const bool aboveLower = condition.lowerOpen ? value > condition.lower : value >= condition.lower;
-    check_.passed = aboveLower && (condition.upperOpen ? value < condition.upper : value <= condition.upper);
+    check_.passed = isInsideLower(value, condition.lower, condition.lowerOpen) &&
+                    isInsideUpper(value, condition.upper, condition.upperOpen);
     return {};
   }
 
