@@ -102,10 +102,14 @@ bool fitsAny(const UserLimit& limit, const DiagnosticRecord& record) {
 
 }  // namespace
 
+ResultVerdict LimitCheck::verdict() const {
+  if (passed || !counts()) return ResultVerdict::kPass;
+  return problem.empty() ? ResultVerdict::kFail : ResultVerdict::kError;
+}
+
 std::string_view LimitCheck::verdictName() const {
-  if (passed) return nameOf(ResultVerdict::kPass);
-  if (skipped) return nameOf(Verdict::kSkip);
-  return counts() && !problem.empty() ? nameOf(ResultVerdict::kError) : nameOf(limit.severity);
+  if (!passed && skipped) return nameOf(Verdict::kSkip);
+  return warns() ? nameOf(LimitSeverity::kWarn) : nameOf(verdict());
 }
 
 bool appliesTo(const UserLimit& limit, const std::string& diagnostic) {
@@ -141,7 +145,18 @@ bool hasFailedResult(const DiagnosticRecord& record) {
   return std::any_of(record.measuredResults.begin(), record.measuredResults.end(),
                      [](const JudgedResult& one) { return one.verdict == ResultVerdict::kFail; }) ||
          std::any_of(checks.begin(), checks.end(),
-                     [](const LimitCheck& check) { return !check.passed && check.counts() && check.problem.empty(); });
+                     [](const LimitCheck& check) { return check.verdict() == ResultVerdict::kFail; });
+}
+
+ResultVerdict verdictOf(const JudgedResult& one, const std::vector<LimitCheck>& checksOfIt) {
+  ResultVerdict verdict = one.verdict;
+  for (const LimitCheck& check : checksOfIt) {
+    const ResultVerdict added = check.verdict();
+    const bool isStricter = verdict == ResultVerdict::kNone || added == ResultVerdict::kError ||
+                            (added == ResultVerdict::kFail && verdict == ResultVerdict::kPass);
+    if (isStricter) verdict = added;
+  }
+  return verdict;
 }
 
 std::vector<LimitCheck> checksOfResult(const std::vector<LimitCheck>& checks, std::size_t index) {
