@@ -66,7 +66,7 @@ OrderedMap<Counts> countsOf(const std::vector<SelftestRow>& rows, const std::vec
     const std::string& name = rows[i].expected.name;
     if (!all.contains(name)) all.set(name, {});
     Counts& counts = *all.find(name);
-    const bool healthy = rows[i].expected.verdict == "pass";
+    const bool healthy = rows[i].expected.mustPass();
     ++(healthy ? counts.healthy : counts.faulty);
     if (verdicts[i] == SelftestVerdict::kDetected) ++counts.detected;
     if (verdicts[i] == SelftestVerdict::kFalseAlarm) ++counts.falseAlarms;
@@ -121,7 +121,7 @@ std::vector<SelftestVerdict> verdictsOf(const std::vector<SelftestRow>& rows) {
   std::vector<SelftestVerdict> verdicts;
   for (const SelftestRow& row : rows) {
     const std::vector<std::uint64_t>& counts = *fired.find(row.scenario);
-    const bool healthy = row.expected.verdict == "pass";
+    const bool healthy = row.expected.mustPass();
     if (row.runs == 0 || std::find(counts.begin(), counts.end(), 0U) != counts.end()) {
       verdicts.push_back(SelftestVerdict::kInvalid);
     } else if (!healthy && row.passes > 0) {
