@@ -1,6 +1,7 @@
 #include "host/command/commands.h"
 
 #include "contract/message_format.h"
+#include "host/model/incomplete_run.h"
 #include "host/record/record_file.h"
 #include "host/record/record_place.h"
 #include "host/record/verification.h"
@@ -103,8 +104,8 @@ std::string interruptionText(const std::vector<RunEvent>& events) {
   const std::optional<std::string>& interrupted = std::get<RunEnded>(events.back()).interrupted;
   if (!interrupted) return {};
   const auto* const began = std::get_if<RunStarted>(&events.front());
-  const std::string none = began != nullptr && began->ofExperiments ? "no experiment" : "no diagnostic";
-  return "the run was interrupted while " + (interrupted->empty() ? none : *interrupted) + " was running";
+  return "the run was interrupted while " + nameOfRunning(began == nullptr ? RunStarted{} : *began, *interrupted) +
+         " was running";
 }
 
 Finding verifyRecord(const std::filesystem::path& file, VerificationProgress& progress) {

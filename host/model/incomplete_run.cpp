@@ -60,10 +60,15 @@ std::vector<DiagnosticRecord> withInterruptedOfAnalysis(const RunStarted& run, s
   return records;
 }
 
+std::string nameOfRunning(const RunStarted& run, const std::string& interrupted) {
+  if (!interrupted.empty()) return interrupted;
+  return run.ofExperiments ? "no experiment" : "no diagnostic";
+}
+
 DiagnosticErrorPtr interruptionOf(const RunStarted& run, const std::string& interrupted) {
-  const std::string idle =
-      run.ofExperiments ? "interrupted while no experiment was running" : "interrupted while no diagnostic was running";
-  return hostError(HostErrorCode::kInterrupted, interrupted.empty() ? idle : interrupted + " was interrupted");
+  return hostError(HostErrorCode::kInterrupted,
+                   interrupted.empty() ? "interrupted while " + nameOfRunning(run, interrupted) + " was running"
+                                       : interrupted + " was interrupted");
 }
 
 }  // namespace quazor
