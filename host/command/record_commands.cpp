@@ -1,5 +1,6 @@
 #include "host/command/commands.h"
 
+#include "base/text/letter_case.h"
 #include "contract/message_format.h"
 #include "host/model/incomplete_run.h"
 #include "host/record/record_file.h"
@@ -145,7 +146,7 @@ ExitCode verifyOne(const std::filesystem::path& file, const Options& options, Co
   for (const std::string& problem : finding.problems) answer += "WRONG  " + printable(problem) + "\n";
   if (!finding.counts.empty()) answer += finding.counts + ", " + problemCount(finding) + "\n";
   if (!finding.missing.empty()) answer += "The record is incomplete: " + finding.missing + ".\n";
-  if (!finding.interrupted.empty()) answer += "T" + printable(finding.interrupted.substr(1)) + ".\n";
+  if (!finding.interrupted.empty()) answer += capitalized(printable(finding.interrupted)) + ".\n";
   writeOutput(options.report, console, answer);
   return finding.code;
 }

@@ -1,5 +1,6 @@
 #include "host/command/selftest.h"
 
+#include "base/text/letter_case.h"
 #include "contract/message_format.h"
 #include "contract/ordered_map.h"
 #include "host/error/host_error.h"
@@ -204,15 +205,12 @@ Json selftestDocument(const SelftestOutcome& outcome) {
   Json json = Json::array();
   for (std::size_t i = 0; i < rows.size(); ++i) {
     const SelftestRow& row = rows[i];
-    std::string verdict(nameOf(verdicts[i]));
-    std::transform(verdict.begin(), verdict.end(), verdict.begin(),
-                   [](char unit) { return unit >= 'A' && unit <= 'Z' ? static_cast<char>(unit - 'A' + 'a') : unit; });
     json.push_back({{"phone", row.scenario},
                     {"name", row.expected.name},
                     {"expected", row.expected.verdict},
                     {"runs", row.runs},
                     {"asExpected", row.asExpected},
-                    {"outcome", verdict},
+                    {"outcome", withSmallLetters(nameOf(verdicts[i]))},
                     {"difference", row.difference.empty() ? Json() : Json(row.difference)},
                     {"faultsFired", row.faultsFired}});
   }
