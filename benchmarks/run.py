@@ -170,6 +170,16 @@ def check_pipeline(requirements, medians):
     requirements.check("an hour of frames: memory stays the same", memory)
 
 
+def check_frame_trace(requirements, medians):
+    def late():
+        off, on = (medians[f"frames/trace {state}/iterations:5"] for state in ("off", "on"))
+        return (on["p99_ns"] - off["p99_ns"] < 1000,
+                f"median {off['median_ns']:.0f} / {on['median_ns']:.0f} ns, "
+                f"99th percentile {off['p99_ns']:.0f} / {on['p99_ns']:.0f} ns")
+
+    requirements.check("a frame that is told to the record or not: 99th percentiles within 1 us", late)
+
+
 def check_channels(requirements, medians):
     def flat():
         costs = [medians[f"channels/{count}/manual_time"]["ns_per_channel"] for count in (60, 10_000, 1_000_000)]
@@ -196,6 +206,7 @@ def main():
         (check_sensor_images, programs.run("sensor_images_benchmark")),
         (check_load, programs.run("load_benchmark", arguments.plugin, empty)),
         (check_pipeline, programs.run("projector_pipeline_benchmark")),
+        (check_frame_trace, programs.run("frame_trace_benchmark")),
         (check_channels, programs.run("report_channels_benchmark")),
         (check_isolation, measure_isolation(build, arguments.quick)),
     )

@@ -6,7 +6,7 @@ import re
 from report_limits import rows_of
 from report_readers import Error, Limit, Result, blurred, number, printable, text_limit
 
-EMPTY = {"meta", "input"}  # elements without an end
+EMPTY = {"meta", "input", "wbr"}  # elements without an end
 MAX_NAME = 160  # columns of a name in a heading
 
 
@@ -81,14 +81,66 @@ def verdict_of(badge):
     return "none" if "none" in badge.attributes["class"] else badge.text.split("\u00a0")[1]
 
 
-def result_of(cells):
-    name, value, unit, limit, *severity, bar, verdict = cells
-    found = verdict_of(verdict.first("span"))
-    svg = bar.first("svg")
-    if svg is not None and (svg.attributes["aria-label"] == "inside the limit") != (found == "pass"):
-        raise ValueError(f"the bar of {name.text} contradicts the verdict {found}")
-    return Result(name.text, number(value.text), unit.text, text_limit(limit.text), found,
-                  "".join(one.text for one in severity).replace("\u2013", ""))
+def limits_of(section):
+    """The limits of the results, a list for each result: its name, value and unit, and a limit, its source, its severity
+    and the verdict."""
+    found = next((one for one in section.all("table") if one.first("caption").text == "Results and their limits"), None)
+    if found is None:
+        return []
+    columns = [one.text for one in found.first("thead").all("th")][3:]
+    groups = []
+    for row in found.first("tbody").all("tr"):
+        cells = [one for one in row.children if isinstance(one, Node)]
+        if cells[0].tag == "th":
+            left = int(cells[0].attributes.get("rowspan", "1"))
+            groups.append([])
+            name, value, unit = cells[:3]
+            cells = cells[3:]
+        left -= 1
+        if left < 0 or len(cells) != len(columns):
+            raise ValueError(f"the rows of {name.text} do not fit their table")
+        shown = dict(zip(columns, cells))
+        verdict = verdict_of(shown["Verdict"].first("span"))
+        svg = shown["In the limit"].first("svg") if "In the limit" in shown else None
+        if svg is not None and (svg.attributes["aria-label"] == "inside the limit") != (verdict == "pass"):
+            raise ValueError(f"the bar of {name.text} contradicts the verdict {verdict}")
+        source = shown.get("Limit from")
+        limit, severity = shown["Limit"].text, ""
+        if source is not None and source.attributes.get("class") != "soft":
+            severity = "fail" if source.first("small") is None else "warn"
+            limit += f" ({source.children[0]})"
+        whole = number(value.attributes.get("title", value.text))
+        groups[-1].append(Result(name.text, whole, unit.text, text_limit(limit), verdict, severity))
+    return groups
+
+
+RANKS = ("fail", "error", "skip", "warn", "pass", "none")
+
+
+def results_of(section):
+    """The rows of results. The worst come first, and a result without a limit of the plug-in has no row for it."""
+    groups = limits_of(section)
+    ranks = [min(RANKS.index(one.verdict) for one in group) for group in groups]
+    if ranks != sorted(ranks):
+        raise ValueError(f"the worst results are not first: {ranks}")
+    rows = []
+    for group in groups:
+        if group[0].severity:
+            rows.append(group[0]._replace(limit=None, verdict="none", severity=""))
+        rows += group
+    return rows
+
+
+def in_order_of_page(rows):
+    """The rows of results as they are in a record, in the order of a page."""
+    groups = []
+    for one in rows:
+        if one.severity:
+            groups[-1].append(one)
+        else:
+            groups.append([one])
+    groups.sort(key=lambda group: min(RANKS.index(one.verdict) for one in group))
+    return [one for group in groups for one in group]
 
 
 def error_of(paragraph):
@@ -114,11 +166,11 @@ def read_section(section):
         "summary": paragraphs[0].text,
         "skip": body[0].text if verdict == "skip" else None,
         "errors": [] if verdict == "skip" else [error_of(one) for one in body],
-        "results": [result_of(row) for row in table(section, "Results and their limits")],
-        "measurements": [(row[0].text, number(row[1].text), row[2].text)
+        "results": results_of(section),
+        "measurements": [(row[0].text, number(row[1].attributes.get("title", row[1].text)), row[2].text)
                          for row in table(section, "Measurements of the experiment")],
         "parameters": [(row[1].text, row[0].text, number(row[2].text))
-                       for row in table(section, "Parameters and where .*") if row[2].text != "not set"],
+                       for row in table(section, "Parameters and where .*") if not row[2].text.startswith("not set (")],
         "log": [(row[1].text, row[2].text) for row in table(section, r"\d+ lines?, by the phone's clock")],
         "seed": int(paragraphs[-1].text[len("Seed "):]),
     }
@@ -154,7 +206,8 @@ def expected(record):
         "summary": printable(record["summary"]),
         "skip": record["skip"] and f"{record['skip'][0]}: {printable(record['skip'][1])}",
         "errors": [Error(printable(one.domain), one.code, printable(one.message)) for one in record["errors"]],
-        "results": [shown(one) for one in rows_of(record, lambda label, *_: Limit(label, None, None))],
+        "results": [shown(one) for one in
+                    in_order_of_page(rows_of(record, lambda label, *_: Limit(label, None, None)))],
         "measurements": [(printable(name), value, printable(unit)) for name, value, unit in record["measurements"]],
         "parameters": [(half, printable(name), value) for half, values in record.get("parameters", {}).items()
                        for name, value in values.items()],

@@ -4,6 +4,7 @@
 
 #include <gmock/gmock.h>
 #include <gtest/gtest.h>
+#include <sys/mman.h>
 #include <sys/wait.h>
 #include <unistd.h>
 
@@ -118,6 +119,23 @@ TEST_F(FrameRingsTest, KeepAFrameThatIsHeldOnlyWhileHalfOfTheRingIsFree) {
   clock_->time += 5ns;
   wide_->handBack(held);
   EXPECT_EQ(take(true).back().frame, (TracedFrame{2, 0, 0, std::nullopt}));
+}
+
+// How many bytes of the memory need not be provided any more.
+std::size_t residentBytes(std::span<std::byte> memory) {
+  const auto page = static_cast<std::size_t>(::sysconf(_SC_PAGESIZE));
+  std::vector<unsigned char> pages(memory.size() / page + 1);
+  EXPECT_EQ(::mincore(memory.data(), memory.size(), pages.data()), 0);
+  return page * static_cast<std::size_t>(std::ranges::count_if(pages, [](unsigned char one) { return one % 2 != 0; }));
+}
+
+TEST_F(FrameRingsTest, HaveTheirMemoryBeforeTheFirstFrameUnlessFramesWait) {
+  if (::madvise(nullptr, 0, MADV_POPULATE_WRITE) != 0) GTEST_SKIP() << "the kernel is older than 5.14";
+  constexpr std::size_t kLeast = 2 * FrameRings::kFramesOfRing * 4 * sizeof(std::int64_t);
+  make();
+  EXPECT_GT(residentBytes(rings_->memory()), kLeast);
+  make(0, WhenTraceIsFull::kWait);
+  EXPECT_LT(residentBytes(rings_->memory()), kLeast / 10);
 }
 
 TEST_F(FrameRingsTest, CountWhatFindsNoRoom) {

@@ -342,10 +342,12 @@ std::string canonicalText(const UserLimit& limit) {
   return diagnostic + nameText(limit.result, true) + " " + conditionText(limit);
 }
 
-std::string labelOf(const UserLimit& limit) {
+std::string nameAndCondition(const UserLimit& limit) {
   const std::string name = limit.name.empty() ? std::string() : limit.name + ": ";
-  return name + nameText(limit.result, true) + " " + conditionText(limit) + " (" + limit.source + ")";
+  return name + nameText(limit.result, true) + " " + conditionText(limit);
 }
+
+std::string labelOf(const UserLimit& limit) { return nameAndCondition(limit) + " (" + limit.source + ")"; }
 
 std::string conditionText(const UserLimit& limit) {
   return std::visit([](const auto& condition) { return textOf(condition); }, limit.condition);

@@ -79,7 +79,10 @@ std::string canonicalText(const UserLimit& limit);
 // The canonical text without the diagnostic and the result, for example ">= 90 frames".
 std::string conditionText(const UserLimit& limit);
 
-// The name, if there is one, the canonical text without the diagnostic, and the source: for the report of a diagnostic.
+// The name, if there is one, and the canonical text without the diagnostic.
+std::string nameAndCondition(const UserLimit& limit);
+
+// The same with the source: for the report of a diagnostic.
 std::string labelOf(const UserLimit& limit);
 
 }  // namespace quazor

@@ -2,6 +2,7 @@
 
 #include "host/report/page/html.h"
 #include "host/report/page/plot.h"
+#include "host/report/page/shown_number.h"
 #include "host/report/sample_images.h"
 #include "host/text/table.h"
 
@@ -29,6 +30,11 @@ bool isTable(const Value& value) {
          });
 }
 
+std::string cellOf(const Value& value) {
+  if (const double* const number = value.doubleNumber()) return numberCell(*number);
+  return element("td class=\"number\"", htmlText(defaultText(value)));
+}
+
 std::string tableOf(const std::string& name, const Dictionary& rows) {
   std::vector<std::string> columns;
   for (const auto& [ignored, row] : rows) {
@@ -37,13 +43,13 @@ std::string tableOf(const std::string& name, const Dictionary& rows) {
     }
   }
   std::string head = element("th scope=\"col\"", "Of");
-  for (const std::string& column : columns) head += element("th scope=\"col\"", htmlText(column));
+  for (const std::string& column : columns) head += element("th scope=\"col\"", breakableName(column));
   std::string body;
   for (const auto& [rowName, row] : rows) {
-    std::string cells = element("th scope=\"row\"", htmlText(rowName));
+    std::string cells = element("th scope=\"row\"", breakableName(rowName));
     for (const std::string& column : columns) {
       const Value* const value = row.dictionary()->find(column);
-      cells += element("td class=\"number\"", value == nullptr ? std::string() : htmlText(defaultText(*value)));
+      cells += value == nullptr ? "<td></td>" : cellOf(*value);
     }
     body += element("tr", cells);
   }
@@ -98,7 +104,7 @@ std::string auxiliarySection(const DiagnosticRecord& record, int level) {
     } else if (isTable(value)) {
       tables += tableOf(name, *value.dictionary());
     } else {
-      others += element("tr", element("th scope=\"row\"", htmlText(name)) +
+      others += element("tr", element("th scope=\"row\"", breakableName(name)) +
                                   element("td class=\"line\"", htmlText(defaultText(value))));
     }
   }

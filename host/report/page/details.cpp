@@ -1,11 +1,13 @@
 #include "host/report/page/details.h"
 
 #include "host/report/page/html.h"
+#include "host/report/page/shown_number.h"
 #include "host/text/table.h"
 #include "host/text/timestamp.h"
 
 #include <algorithm>
 #include <chrono>
+#include <cmath>
 #include <cstddef>
 #include <optional>
 #include <string_view>
@@ -16,6 +18,8 @@ namespace quazor {
 namespace {
 
 using std::chrono::nanoseconds;
+
+constexpr const char* kNotSet = "not set (the diagnostic's own default)";
 
 // How long a stage took, by both clocks.
 struct StageLength {
@@ -51,36 +55,20 @@ std::vector<StageLength> lengthsOf(const DiagnosticRecord& record) {
 
 double secondsOf(nanoseconds time) { return std::chrono::duration<double>(time).count(); }
 
-std::string secondsText(std::optional<nanoseconds> time) {
-  return time ? roundedText(secondsOf(*time)) + " s" : "\xE2\x80\x93";
-}
-
-std::string barOf(const std::vector<StageLength>& lengths) {
-  constexpr double kWidth = 700;
-  constexpr double kLeast = 2;  // a stage without a length is still seen
-  double total = 0;
-  for (const StageLength& one : lengths) total += secondsOf(one.shown());
-  if (total <= 0) return {};
-  const double room = kWidth - kLeast * static_cast<double>(lengths.size());
-  std::string svg = R"(<svg class="stages" viewBox="0 0 720 34" role="img" aria-label="Time line of the stages">)";
-  double at = 10;
-  for (const StageLength& one : lengths) {
-    const double width = kLeast + secondsOf(one.shown()) / total * room;
-    const std::string name(nameOf(one.stage));
-    svg += "<rect class=\"stage " + name + (one.byWall ? "" : " open") + "\" x=\"" + coordinate(at) +
-           "\" y=\"4\" width=\"" + coordinate(width) + "\" height=\"26\"/>";
-    if (width > 70) svg += "<text x=\"" + coordinate(at + 6) + "\" y=\"21\">" + name + "</text>";
-    at += width;
-  }
-  return svg + "</svg>\n";
+// Three digits are enough to see what took long.
+std::string lengthText(std::optional<nanoseconds> time) {
+  if (!time) return "\xE2\x80\x93";
+  const double seconds = secondsOf(*time);
+  return seconds == 0 || std::abs(seconds) >= 1 ? roundedText(std::round(seconds * 1e3) / 1e3) + " s"
+                                                : significantDigits(seconds * 1e3, 3) + " ms";
 }
 
 std::string parameterRows(Part part, const std::vector<ResolvedParameter>& parameters) {
   std::string rows;
   for (const ResolvedParameter& one : parameters) {
     rows +=
-        element("tr", element("th scope=\"row\"", htmlText(one.name)) + element("td", std::string(nameOf(part))) +
-                          element("td class=\"number\"", one.value ? htmlText(defaultText(*one.value)) : "not set") +
+        element("tr", element("th scope=\"row\"", breakableName(one.name)) + element("td", std::string(nameOf(part))) +
+                          element("td class=\"number\"", one.value ? htmlText(defaultText(*one.value)) : kNotSet) +
                           element("td", htmlText(one.source)) + element("td", htmlText(one.declaration.summary()))) +
         "\n";
   }
@@ -130,12 +118,11 @@ std::string stagesSection(const DiagnosticRecord& record, int level) {
   std::string rows;
   for (const StageLength& one : lengths) {
     rows += element("tr", element("th scope=\"row\"", std::string(nameOf(one.stage))) +
-                              element("td class=\"number\"", secondsText(one.byPhone)) +
-                              element("td class=\"number\"", one.byWall ? secondsText(one.byWall) : "did not end"));
+                              element("td class=\"number\"", lengthText(one.byPhone)) +
+                              element("td class=\"number\"", one.byWall ? lengthText(one.byWall) : "did not end"));
   }
-  return heading(level, "Stages") + barOf(lengths) +
-         tableOf("Stages and how long they took", {"Stage", "By the phone's clock", "By the clock of the machine"},
-                 rows);
+  return heading(level, "Stages") + tableOf("Stages and how long they took",
+                                            {"Stage", "By the phone's clock", "By the clock of the machine"}, rows);
 }
 
 std::string parametersSection(const DiagnosticRecord& record, int level) {
@@ -149,8 +136,7 @@ std::string parametersSection(const DiagnosticRecord& record, int level) {
 std::string measurementsSection(const DiagnosticRecord& record, int level) {
   std::string rows;
   for (const auto& [name, measurement] : record.measurements) {
-    rows += element("tr", element("th scope=\"row\"", htmlText(name)) +
-                              element("td class=\"number\"", htmlText(defaultText(measurement.value()))) +
+    rows += element("tr", element("th scope=\"row\"", breakableName(name)) + numberCell(measurement.value()) +
                               element("td", htmlText(measurement.unit().symbol()))) +
             "\n";
   }

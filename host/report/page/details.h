@@ -8,7 +8,7 @@
 
 namespace quazor {
 
-// The stages as a time line and a table.
+// The stages and how long they took.
 std::string stagesSection(const DiagnosticRecord& record, int level);
 
 // Each parameter with its value and where it came from.

@@ -18,6 +18,7 @@ namespace {
 
 constexpr double kPerMillisecond = 1e6;  // nanoseconds
 constexpr double kPerSecond = 1e9;
+constexpr double kLeastSpan = 0.1;  // milliseconds: a plot shows frames that are late, not the steps of a clock
 
 // Minimum, median and maximum.
 struct Spread {
@@ -176,16 +177,23 @@ std::string plotsOf(const RecordedStream& stream, const StreamFacts& facts, cons
   if (facts.interval) {
     const bool isMarked = !marks.empty();
     add(isMarked ? "Interval between frames, in ms; gaps are marked" : "Interval between frames, in ms",
-        plotSvg({"Interval between the frames of " + stream.name, "ms", facts.intervals, std::move(marks),
-                 facts.interval->median}));
+        plotSvg({"Interval between the frames of " + stream.name,
+                 "ms",
+                 facts.intervals,
+                 std::move(marks),
+                 facts.interval->median,
+                 {},
+                 kLeastSpan}));
   }
   if (facts.offset) {
-    add("Offset against " + htmlName(reference.name) + ", in ms",
+    add("Offset against " + htmlName(reference.name) + ", the stream that began first, in ms",
         plotSvg({"Offset of " + stream.name + " against " + reference.name,
                  "ms",
                  facts.offsets,
                  {},
-                 facts.offset->median}));
+                 facts.offset->median,
+                 {},
+                 kLeastSpan}));
   }
   return html;
 }
@@ -249,7 +257,8 @@ std::string comparedIntervals(const RecordedStream& before, const RecordedStream
                                    facts[0].intervals,
                                    {},
                                    median,
-                                   facts[1].intervals});
+                                   facts[1].intervals,
+                                   kLeastSpan});
   return element("p", htmlText(sentence)) +
          "<table><caption>Frames of both runs; interval in ms: median (minimum to maximum)</caption><thead><tr>"
          "<th scope=\"col\">Run</th><th scope=\"col\">Frames</th><th scope=\"col\">Missing</th>"

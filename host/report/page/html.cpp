@@ -47,6 +47,23 @@ std::string element(std::string_view tag, std::string_view content) {
   return html;
 }
 
+std::string breakableName(std::string_view name) {
+  const std::string shown = printable(name);
+  const auto isUpper = [](char unit) { return unit >= 'A' && unit <= 'Z'; };
+  const auto isLower = [](char unit) { return unit >= 'a' && unit <= 'z'; };
+  std::string html;
+  std::size_t begin = 0;
+  for (std::size_t i = 1; i < shown.size(); ++i) {
+    const bool isAfterMark = shown[i - 1] == '.' || shown[i - 1] == '_';
+    if (!isAfterMark && !(isLower(shown[i - 1]) && isUpper(shown[i]))) continue;
+    html += xmlAttribute(shown.substr(begin, i - begin)) + "<wbr>";
+    begin = i;
+  }
+  return html + xmlAttribute(shown.substr(begin));
+}
+
+std::string breakablePhrase(std::string_view name) { return breakableName(shortened(printable(name), kMaxNameWidth)); }
+
 std::string htmlName(std::string_view name) { return xmlAttribute(shortened(printable(name), kMaxNameWidth)); }
 
 std::string wholeName(std::string_view name) {
@@ -61,7 +78,9 @@ std::string coordinate(double value) {
   return text == "-0" ? "0" : text;
 }
 
-std::string roundedText(double value) { return digitsOf(value, std::chars_format::general, 6); }
+std::string significantDigits(double value, int digits) { return digitsOf(value, std::chars_format::general, digits); }
+
+std::string roundedText(double value) { return significantDigits(value, 6); }
 
 std::string heading(int level, std::string_view content) { return element("h" + std::to_string(level), content); }
 

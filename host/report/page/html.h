@@ -20,14 +20,23 @@ std::string htmlProse(std::string_view text);
 // <tag>content</tag>. The tag may have attributes, as in "td class=\"value\"". `content` is HTML.
 std::string element(std::string_view tag, std::string_view content);
 
+// A name of several words, which may be broken after dots and underscores and before capitals only.
+std::string breakableName(std::string_view name);
+
 // A phrase, in a heading or a cell, for a name of any length: a very long one is cut.
 std::string htmlName(std::string_view name);
+
+// The same that may be broken like breakableName().
+std::string breakablePhrase(std::string_view name);
 
 // The whole name in a paragraph of its own if htmlName() cuts it; else nothing.
 std::string wholeName(std::string_view name);
 
 // "1.5": with at most one decimal, for coordinates.
 std::string coordinate(double value);
+
+// A finite number with that many significant digits.
+std::string significantDigits(double value, int digits);
 
 // A number with six significant digits, for what was calculated from results.
 std::string roundedText(double value);

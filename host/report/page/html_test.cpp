@@ -30,6 +30,13 @@ TEST(HtmlName, CutsAVeryLongName) {
   EXPECT_EQ(wholeName("<short>"), "");
 }
 
+TEST(BreakableName, IsBrokenBetweenItsWords) {
+  EXPECT_EQ(breakableName("BackTele.FrameOffset"), "Back<wbr>Tele.<wbr>Frame<wbr>Offset");
+  EXPECT_EQ(breakableName("Number INT_FAULT_<b>"), "Number INT_<wbr>FAULT_<wbr>&lt;b&gt;");
+  EXPECT_EQ(breakableName("I2CErrorCount"), "I2CError<wbr>Count");
+  EXPECT_EQ(breakableName(""), "");
+}
+
 TEST(Element, ClosesATagWithAttributes) {
   EXPECT_EQ(element("td class=\"number\"", "1"), "<td class=\"number\">1</td>");
 }

@@ -37,8 +37,8 @@ std::string limitBar(double value, const std::optional<QZLimit>& limit, bool pas
   const auto isFinite = [](double one) { return std::isfinite(one); };
   if (!std::all_of(numbers.begin(), numbers.end(), isFinite)) return {};
   const auto [least, greatest] = std::minmax_element(numbers.begin(), numbers.end());
-  double span = *greatest - *least;
-  if (span == 0) span = std::max(std::abs(*least), 1.0);
+  const double span = *greatest - *least;
+  if (span == 0 || (lower && upper && *lower == *upper)) return {};
   const double begin = *least - span * kBarMargin;
   const double range = *greatest + span * kBarMargin - begin;
   if (!std::isfinite(range) || range <= 0) return {};
@@ -53,7 +53,7 @@ std::string limitBar(double value, const std::optional<QZLimit>& limit, bool pas
            "\" height=\"8\"/>";
   }
   if (lower) svg += line("bound", left, 2, 14);
-  if (upper && (!lower || right != left)) svg += line("bound", right, 2, 14);
+  if (upper) svg += line("bound", right, 2, 14);
   svg += "<circle class=\"" + std::string(passed ? "pass" : "fail") + "\" cx=\"" + coordinate(place(value)) +
          "\" cy=\"8\" r=\"4\"/></svg>";
   return svg;

@@ -53,8 +53,10 @@ TEST(LimitBar, ReachesTheEdgeWithoutABound) {
   EXPECT_THAT(limitBar(1, between(boundAt(0), nullptr), true), HasSubstr("x=\"22.9\" y=\"4\" width=\"137.1\""));
 }
 
-TEST(LimitBar, OfOneAllowedValueIsAMark) {
-  EXPECT_THAT(limitBar(0, between(boundAt(0), boundAt(0)), true), HasSubstr("<circle class=\"pass\" cx=\"80\""));
+TEST(LimitBar, IsNotDrawnWithNothingToSee) {
+  EXPECT_EQ(limitBar(0, between(boundAt(0), boundAt(0)), true), "");
+  EXPECT_EQ(limitBar(5, between(boundAt(0), boundAt(0)), false), "");
+  EXPECT_EQ(limitBar(0, between(nullptr, boundAt(0)), true), "");
 }
 
 TEST(LimitBar, IsNotDrawnWithoutFiniteNumbers) {

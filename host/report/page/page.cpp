@@ -49,12 +49,27 @@ std::string runsTable(const std::vector<ShownRun>& runs) {
          element("tbody", rows) + "</table>\n";
 }
 
+// What the verdicts mean that need attention, if one of the runs has one.
+std::string verdictsText(const std::vector<ShownRun>& runs) {
+  const auto has = [&runs](Verdict verdict) {
+    return std::ranges::any_of(runs, [verdict](const ShownRun& run) {
+      return std::ranges::find(run.records, verdict, &DiagnosticRecord::verdict) != run.records.end();
+    });
+  };
+  std::string text;
+  if (has(Verdict::kFail)) text += " FAIL: a result was measured and is outside a limit.";
+  if (has(Verdict::kError))
+    text += " ERROR: the diagnostic could not measure or judge, so it says neither good nor bad.";
+  if (has(Verdict::kSkip)) text += " SKIP: the diagnostic was not run.";
+  return text.empty() ? text : element("p class=\"soft\"", text.substr(1)) + "\n";
+}
+
 std::string pageOfOne(const ShownRun& run, const PageOptions& options) {
   const PageVerdict verdict = verdictOf(run);
   return document(
       verdict.word + ": " + htmlName(shortPhone(run.began)),
       bannerOf(verdict.kind, verdict.word, deviceText({run.began}), htmlText(summaryOf(run)), factsOf(run.began)) +
-          element("main", "\n" + runSections(run, 1, 2, options)) + "\n" + footerOf(run.began));
+          element("main", "\n" + verdictsText({run}) + runSections(run, 1, 2, options)) + "\n" + footerOf(run.began));
 }
 
 std::string pageOfMany(const std::vector<ShownRun>& runs, const PageOptions& options) {
@@ -79,10 +94,10 @@ std::string pageOfMany(const std::vector<ShownRun>& runs, const PageOptions& opt
   return document(
       worst.word + ": " + countText(runs.size(), "run"),
       bannerOf(worst.kind, worst.word, deviceText(began), sentence, "The verdict is that of the worst run.") +
-          element("main",
-                  "\n<h2>Runs</h2>\n<div class=\"scroll\" tabindex=\"0\" role=\"region\" "
-                  "aria-label=\"Table of runs\">" +
-                      runsTable(runs) + "</div>\n" + sections) +
+          element("main", "\n" + verdictsText(runs) +
+                              "<h2>Runs</h2>\n<div class=\"scroll\" tabindex=\"0\" role=\"region\" "
+                              "aria-label=\"Table of runs\">" +
+                              runsTable(runs) + "</div>\n" + sections) +
           "\n" + footerOf(runs.front().began));
 }
 

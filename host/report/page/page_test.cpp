@@ -77,12 +77,28 @@ TEST(ReportPage, HasEveryPartOfADiagnostic) {
   run.records[0].stages = {{Stage::kRun, Date(), Date() + std::chrono::seconds(1)}, {Stage::kTeardown, Date(), {}}};
   run.streams = {{{"wide", {{0, 0, 0, {}}, {1, 33'000'000, 33'000'000, {}}}, 0}}};
   const std::string page = run.page();
-  for (const char* part :
-       {"Domain code -1", "it failed", "caused by ", "the cause", "<th scope=\"row\">Count</th>", "command line",
-        "not set", "<th scope=\"row\">Raw</th>", "<th scope=\"row\">bytes</th>", "a line", "CaptureStream.start",
-        "Seed 7", "Stream wide", "did not end", "p.so", "phone.json", "quazor run A \\\n  --plugin p.so"}) {
+  for (const char* part : {"Domain code -1", "it failed", "caused by ", "the cause", "<th scope=\"row\">Count</th>",
+                           "command line", "not set (the diagnostic's own default)", "<th scope=\"row\">Raw</th>",
+                           "<th scope=\"row\">bytes</th>", "a line", "CaptureStream.start", "Seed 7", "Stream wide",
+                           "did not end", "p.so", "phone.json", "quazor run A \\\n  --plugin p.so"}) {
     EXPECT_THAT(page, HasSubstr(part)) << part;
   }
+}
+
+TEST(ReportPage, SaysOnceWhatTheVerdictsMean) {
+  const SampleRun bad({recordOf("A", Verdict::kFail), recordOf("B", Verdict::kFail)});
+  const SampleRun broken({recordOf("A", Verdict::kError)});
+  const std::string page = reportPage({bad.shown(), broken.shown()}, {});
+  EXPECT_EQ(countOf(page, "FAIL: a result"), 1U);
+  EXPECT_EQ(countOf(page, "ERROR: the diagnostic"), 1U);
+  EXPECT_THAT(bad.page(), Not(HasSubstr("ERROR: the diagnostic")));
+  EXPECT_THAT(SampleRun({recordOf("A", Verdict::kPass)}).page(), Not(HasSubstr("FAIL")));
+}
+
+TEST(ReportPage, SaysWhyThereAreNoResults) {
+  SampleRun run({recordOf("A", Verdict::kError)});
+  run.records[0].measuredResults.clear();
+  EXPECT_THAT(run.page(), HasSubstr("<td>none: ended with an error</td>"));
 }
 
 TEST(ReportPage, CanLeaveOutFrames) {

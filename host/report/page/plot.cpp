@@ -14,6 +14,10 @@ constexpr double kPlotWidth = 640;  // of the part with the curve
 constexpr double kPlotHeight = 110;
 constexpr double kPlotLeft = 70;  // of the curve, where the labels of y are
 constexpr double kPlotTop = 8;
+constexpr double kHeightOfCurves = 1.2;  // the height of the plot is that many times that of its curves
+constexpr double kTextHeight = 12;
+constexpr double kHalfText = 4;
+constexpr int kLabelDigits = 4;
 constexpr std::size_t kColumns = 320;
 
 // Maps a range of numbers to coordinates.
@@ -88,6 +92,14 @@ Ranges rangesOf(const Plot& plot) {
   return ranges;
 }
 
+// With a margin above and below the curves.
+Scale heightScaleOf(const Ranges& ranges, double leastSpan) {
+  const double span = std::max(ranges.greatest - ranges.least, leastSpan);
+  const double middle = ranges.least + (ranges.greatest - ranges.least) / 2;
+  const double half = span / 2 * kHeightOfCurves;
+  return scaleOf(middle - half, middle + half, kPlotTop + kPlotHeight, -kPlotHeight);
+}
+
 // Marks at the same place are one.
 std::string marksOf(const std::vector<double>& marks, const Scale& x) {
   std::string path;
@@ -107,16 +119,20 @@ std::string plotSvg(const Plot& plot) {
   if (plot.points.size() < 2) return {};
   const Ranges ranges = rangesOf(plot);
   const Scale x = scaleOf(ranges.begin, ranges.end, kPlotLeft, kPlotWidth);
-  const Scale y = scaleOf(ranges.least, ranges.greatest, kPlotTop + kPlotHeight, -kPlotHeight);
+  const Scale y = heightScaleOf(ranges, plot.leastSpan);
   std::string svg = "<svg class=\"plot\" viewBox=\"0 0 720 140\" role=\"img\" aria-label=\"" + htmlText(plot.label) +
                     "\"><rect class=\"ground\" x=\"70\" y=\"8\" width=\"640\" height=\"110\"/>";
   svg += marksOf(plot.marks, x);
   svg += "<path class=\"median\" d=\"M70 " + coordinate(y.at(plot.median)) + "h640\"/>";
   svg += "<path class=\"curve\" d=\"" + pathOf(plot.points, x, y) + "\"/>";
   if (!plot.others.empty()) svg += "<path class=\"curve1\" d=\"" + pathOf(plot.others, x, y) + "\"/>";
-  svg += text("end", kPlotLeft - 6, kPlotTop + 10, roundedText(ranges.greatest));
-  svg += text("end", kPlotLeft - 6, kPlotTop + kPlotHeight, roundedText(ranges.least));
-  svg += text("end", kPlotLeft - 6, kPlotTop + kPlotHeight / 2, htmlText(plot.unit));
+  const double top = y.at(ranges.greatest);
+  const double bottom = y.at(ranges.least);
+  const std::string unit = " " + htmlText(plot.unit);
+  svg += text("end", kPlotLeft - 6, top + kHalfText, significantDigits(ranges.greatest, kLabelDigits) + unit);
+  if (bottom - top > kTextHeight) {
+    svg += text("end", kPlotLeft - 6, bottom + kHalfText, significantDigits(ranges.least, kLabelDigits) + unit);
+  }
   svg += text("start", kPlotLeft, 134, roundedText(ranges.begin) + " s");
   svg += text("end", kPlotLeft + kPlotWidth, 134, roundedText(ranges.end) + " s");
   return svg + "</svg>\n";

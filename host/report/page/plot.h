@@ -18,6 +18,7 @@ struct Plot {
   std::vector<double> marks{};      // x of what is marked
   double median = 0;                // of y, shown by a line
   std::vector<PlotPoint> others{};  // a second curve to compare with
+  double leastSpan = 0;             // of y: smaller differences are not stretched to the height of the plot
 };
 
 // The size of the SVG is bounded: of many points, it has the minimum and the maximum of each of its columns. Empty for

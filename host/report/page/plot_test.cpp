@@ -21,7 +21,9 @@ Plot plotOf(std::size_t points) {
   return plot;
 }
 
-TEST(PlotSvg, ShowsEveryPointOfAFew) { EXPECT_THAT(plotSvg(plotOf(3)), HasSubstr("d=\"M70 118L390 8L710 118\"")); }
+TEST(PlotSvg, ShowsEveryPointOfAFew) {
+  EXPECT_THAT(plotSvg(plotOf(3)), HasSubstr("d=\"M70 108.8L390 17.2L710 108.8\""));
+}
 
 // A mark at every point and a name as long as it may be do not make it grow either.
 TEST(PlotSvg, IsBoundedAndKeepsTheOneExtreme) {
@@ -29,16 +31,16 @@ TEST(PlotSvg, IsBoundedAndKeepsTheOneExtreme) {
   for (const PlotPoint& point : plot.points) plot.marks.push_back(point.x);
   const std::string svg = plotSvg(plot);
   EXPECT_LT(svg.size(), 30'000U);
-  EXPECT_THAT(svg, HasSubstr(" 8L"));  // the extreme is at the top of the plot
-  EXPECT_THAT(svg, HasSubstr(">66</text>"));
+  EXPECT_THAT(svg, HasSubstr(" 17.2L"));  // the extreme is the highest point
+  EXPECT_THAT(svg, HasSubstr(">66 ms</text>"));
 }
 
 TEST(PlotSvg, ShowsTwoCurvesOnOneScale) {
   Plot plot = plotOf(3);
   plot.others = {{0, 33}, {4, 99}};
   const std::string svg = plotSvg(plot);
-  EXPECT_THAT(svg, HasSubstr("<path class=\"curve\" d=\"M70 118L230 63L390 118\""));
-  EXPECT_THAT(svg, HasSubstr("<path class=\"curve1\" d=\"M70 118L710 8\""));
+  EXPECT_THAT(svg, HasSubstr("<path class=\"curve\" d=\"M70 108.8L230 63L390 108.8\""));
+  EXPECT_THAT(svg, HasSubstr("<path class=\"curve1\" d=\"M70 108.8L710 17.2\""));
 }
 
 TEST(PlotSvg, TakesValuesThatAreAllEqual) {
@@ -46,6 +48,16 @@ TEST(PlotSvg, TakesValuesThatAreAllEqual) {
   plot.points = {{0, 5}, {1, 5}};
   plot.median = 5;
   EXPECT_THAT(plotSvg(plot), HasSubstr("d=\"M70 63L710 63\""));
+}
+
+TEST(PlotSvg, DoesNotStretchTheStepsOfAClock) {
+  Plot plot = plotOf(2);
+  plot.points = {{0, 33.333333}, {1, 33.333334}};
+  plot.leastSpan = 0.1;
+  EXPECT_THAT(plotSvg(plot), HasSubstr("d=\"M70 63L710 63\""));
+  EXPECT_THAT(plotSvg(plot), HasSubstr(">33.33 ms</text>"));
+  plot.leastSpan = 0;
+  EXPECT_THAT(plotSvg(plot), Not(HasSubstr("d=\"M70 63L710 63\"")));
 }
 
 TEST(PlotSvg, TakesTimesThatAreAllEqual) {

@@ -136,12 +136,19 @@ std::string findings(const ShownRun& run, std::size_t number, int level, const P
 
 std::string rowOf(const DiagnosticRecord& record, const std::string& id) {
   const std::string trial = trialTextWithSeed(record);
-  const std::string results = record.skip ? textOf(*record.skip) : resultCountsText(record);
-  return element("tr", element("th scope=\"row\"", "<a href=\"#" + id + "\">" + htmlName(record.name) + "</a>" +
+  std::string results = record.skip ? textOf(*record.skip) : resultCountsText(record);
+  if (results.empty()) results = record.error != nullptr ? "none: ended with an error" : "none";
+  return element("tr", element("th scope=\"row\"", "<a href=\"#" + id + "\">" + breakablePhrase(record.name) + "</a>" +
                                                        (trial.empty() ? "" : " (" + trial + ")")) +
                            element("td", verdictBadge(nameOf(record.verdict))) + element("td", htmlText(results)) +
                            element("td class=\"number\"", durationText(record))) +
          "\n";
+}
+
+// Wide tables scroll by themselves, also with the keyboard.
+std::string scrolling(const std::string& label, const std::string& table) {
+  if (table.empty()) return table;
+  return "<div class=\"scroll\" tabindex=\"0\" role=\"region\" aria-label=\"" + label + "\">" + table + "</div>\n";
 }
 
 std::string overview(const ShownRun& run, std::size_t number, int level) {
@@ -152,26 +159,21 @@ std::string overview(const ShownRun& run, std::size_t number, int level) {
                    : missingOf(run.began, run.records);
   for (const PlannedDiagnostic& one : neverRun) {
     rows +=
-        element("tr class=\"never\"", element("th scope=\"row\"", htmlName(one.name)) +
+        element("tr class=\"never\"", element("th scope=\"row\"", breakablePhrase(one.name)) +
                                           "<td>never run</td><td>The run ended before this was started.</td><td></td>");
   }
   if (rows.empty()) return {};
   const std::string what = run.began.ofExperiments ? "Experiment" : "Diagnostic";
-  return heading(level, what + "s") + "<table><caption>" + what +
-         "s in the order of the run</caption><thead><tr><th scope=\"col\">" + what +
-         "</th><th scope=\"col\">Verdict</th><th scope=\"col\">Results</th><th scope=\"col\">Took</th></tr></thead>\n" +
-         element("tbody", rows) + "</table>\n";
+  const std::string table =
+      "<table><caption>" + what + "s in the order of the run</caption><thead><tr><th scope=\"col\">" + what +
+      "</th><th scope=\"col\">Verdict</th><th scope=\"col\">Results</th><th scope=\"col\">Took</th></tr></thead>\n" +
+      element("tbody", rows) + "</table>\n";
+  return heading(level, what + "s") + scrolling(what + "s of run " + std::to_string(number), table);
 }
 
 // Names an entry so that no other part of the page has the same label.
 std::string entryText(const ShownRun& run, std::size_t number, std::size_t index) {
   return formatMessage("%@, entry %@ of run %@", htmlName(run.records[index].name), index + 1, number);
-}
-
-// Wide tables scroll by themselves, also with the keyboard.
-std::string scrolling(const std::string& label, const std::string& table) {
-  if (table.empty()) return table;
-  return "<div class=\"scroll\" tabindex=\"0\" role=\"region\" aria-label=\"" + label + "\">" + table + "</div>\n";
 }
 
 std::string framesOf(const ShownRun& run, std::size_t number, std::size_t index, int level) {
@@ -187,13 +189,14 @@ std::string diagnosticSection(const ShownRun& run, std::size_t number, std::size
   std::string body = wholeName(record.name) + element("p", htmlText(record.summary));
   body += errorParagraphs(record);
   if (record.skip) body += element("p", htmlText(textOf(*record.skip)));
-  body += scrolling("Results of " + entryText(run, number, index), resultsTable(record));
+  const std::string entry = entryText(run, number, index);
+  body += scrolling("Results of " + entry, resultsTable(record));
   if (options.frames) body += framesOf(run, number, index, level + 1);
-  body += scrolling("Counters and other data of " + entryText(run, number, index), auxiliarySection(record, level + 1));
+  body += scrolling("Counters and other data of " + entry, auxiliarySection(record, level + 1));
   body += measurementsSection(record, level + 1);
-  body += parametersSection(record, level + 1);
-  body += stagesSection(record, level + 1);
-  body += faultsSection(record, level + 1);
+  body += scrolling("Parameters of " + entry, parametersSection(record, level + 1));
+  body += scrolling("Stages of " + entry, stagesSection(record, level + 1));
+  body += scrolling("Faults in " + entry, faultsSection(record, level + 1));
   body += logSection(record, level + 1, id + "-log");
   body += element("p class=\"soft\"", "Seed " + std::to_string(record.seed));
   const bool isOpen = record.verdict != Verdict::kPass || run.records.size() == 1;

@@ -41,16 +41,16 @@ td small{display:block}
 .scroll{overflow-x:auto}
 table{border-collapse:collapse;margin:.6rem 0 1.2rem;font-size:.9375rem}
 caption{text-align:left;color:var(--soft);padding:.2rem 0}
-th,td{text-align:left;vertical-align:top;padding:.25rem .75rem .25rem 0;border-bottom:1px solid var(--line)}
-thead th{border-bottom:2px solid var(--line);font-weight:600;white-space:nowrap}
-tbody th{font-weight:500;min-width:16rem}
-tbody th,.line,.whole,h1,h2,h3,h4,p{overflow-wrap:anywhere}
+th,td{text-align:left;vertical-align:top;padding:.25rem .6rem .25rem .25rem;border-bottom:1px solid var(--line)}
+thead th{border-bottom:2px solid var(--line);font-weight:600;vertical-align:bottom}
+tbody th{font-weight:500}
+.line,.whole,h1,h2,h3,h4,p{overflow-wrap:anywhere}
 .number{text-align:right;font-variant-numeric:tabular-nums;white-space:nowrap}
 tr.bad th,tr.bad td{background:var(--failground)}
 .line,pre,code{white-space:pre-wrap;font-family:ui-monospace,"DejaVu Sans Mono",Menlo,Consolas,monospace;font-size:.875rem}
 pre{background:var(--panel);border:1px solid var(--line);border-radius:4px;padding:.7rem 1rem;margin:.5rem 0}
 .whole{max-height:8rem;overflow:auto;color:var(--soft)}
-.runs tbody th{min-width:5rem}.first{color:var(--curve);font-weight:650}.second{color:var(--second);font-weight:650}
+.first{color:var(--curve);font-weight:650}.second{color:var(--second);font-weight:650}
 details{border:1px solid var(--line);border-radius:6px;margin:.8rem 0;padding:0 1.1rem}
 details[open]{padding-bottom:.8rem}
 summary{cursor:pointer;padding:.7rem 0}
@@ -63,14 +63,12 @@ svg{display:block;max-width:100%}
 svg.bar{width:160px;height:16px;margin-top:.25rem}
 .axis{stroke:var(--line);stroke-width:1}.allowed{fill:var(--allowed)}.bound{stroke:var(--text);stroke-width:2}
 circle.pass{fill:var(--pass)}circle.fail{fill:var(--fail)}circle{stroke:var(--ground);stroke-width:1}
-svg.plot,svg.stages{width:720px}
+svg.plot{width:720px}
 .ground{fill:var(--panel);stroke:var(--line)}.curve,.curve0,.curve1{fill:none;stroke:var(--curve);stroke-width:1.5;
 stroke-linejoin:round}
 .curve1{stroke:var(--second)}.median{stroke:var(--soft);stroke-dasharray:4 4;fill:none}
 .mark{stroke:var(--fail);stroke-width:1.5;stroke-opacity:.55;fill:none}
 svg text{font-size:12px;fill:var(--soft)}svg .end{text-anchor:end}
-svg .stage{fill:var(--skipground);stroke:var(--soft)}svg .stage.run{fill:var(--passground)}
-svg .stage.open{fill:var(--failground)}svg.stages text{fill:var(--text)}
 .images{display:flex;flex-wrap:wrap;gap:.75rem}.image{margin:0;width:200px}
 svg.samples{width:200px;height:60px;background:var(--panel)}
 .filter{border:1px solid var(--line);border-radius:4px;display:inline-block;padding:.1rem .8rem .4rem}
@@ -79,7 +77,7 @@ svg.samples{width:200px;height:60px;background:var(--panel)}
 tr.debug td{color:var(--soft)}table tr.error td{color:var(--fail)}
 footer{color:var(--soft);font-size:.875rem;padding-top:1.5rem;padding-bottom:2rem}
 @media (max-width:40rem){h1 .word{font-size:2.4rem}header>div,main,footer{padding-left:.9rem;padding-right:.9rem}
-details{padding:0 .7rem}tbody th{min-width:9rem}svg.plot,svg.stages{min-width:560px}}
+details{padding:0 .7rem}svg.plot{min-width:560px}}
 @media print{:root{color-scheme:light;--ground:#fff;--panel:#fff;--text:#000;--soft:#333;--line:#999;--link:#000;
 --pass:#000;--passground:#fff;--fail:#000;--failground:#fff;--error:#000;--errorground:#fff;--skip:#000;
 --skipground:#fff;--curve:#000;--second:#555;--allowed:#ccc}
