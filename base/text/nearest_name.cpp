@@ -1,7 +1,8 @@
 #include "base/text/nearest_name.h"
 
+#include "base/text/letter_case.h"
+
 #include <algorithm>
-#include <cctype>
 #include <iterator>
 
 namespace quazor {
@@ -48,8 +49,7 @@ std::string didYouMeanOf(std::string_view name, std::string_view what, const std
   std::string list;
   for (const std::string& one : candidates) list += (list.empty() ? "" : ", ") + one;
   std::string suggestion = didYouMean(name, candidates);
-  std::string all(what);
-  if (!suggestion.empty()) all.front() = static_cast<char>(std::toupper(static_cast<unsigned char>(all.front())));
+  const std::string all = suggestion.empty() ? std::string(what) : capitalized(what);
   suggestion += suggestion.empty() ? "; " : " ";
   return suggestion + all + " are " + (list.empty() ? "none" : list);
 }

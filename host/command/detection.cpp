@@ -250,7 +250,7 @@ std::string alarmText(const DiagnosticRecord& record) {
     if (one.verdict == ResultVerdict::kFail) failed.push_back(one.result.name());
   }
   for (const LimitCheck& check : limitChecksOf(record)) {
-    if (!check.passed && check.counts())
+    if (check.verdict() != ResultVerdict::kPass)
       failed.push_back(check.result.name() + " by the limit " + labelOf(check.limit));
   }
   std::string text = record.name + " fails: ";

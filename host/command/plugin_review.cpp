@@ -327,7 +327,7 @@ class PluginReview {
   // True if the diagnostic returned an error, as on a phone without its hardware; false if the host found it to be
   // wrong.
   static bool endedInItsOwnError(const DiagnosticRecord& record) {
-    return record.verdict == Verdict::kError && record.error->domain() != QuazorHostErrorDomain;
+    return record.verdict == Verdict::kError && !isHostError(record.error);
   }
 
   void reviewRecord(const DiagnosticRecord& record, const std::string& phone) {

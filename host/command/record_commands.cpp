@@ -1,6 +1,8 @@
 #include "host/command/commands.h"
 
+#include "base/text/letter_case.h"
 #include "contract/message_format.h"
+#include "host/model/incomplete_run.h"
 #include "host/record/record_file.h"
 #include "host/record/record_place.h"
 #include "host/record/verification.h"
@@ -103,8 +105,8 @@ std::string interruptionText(const std::vector<RunEvent>& events) {
   const std::optional<std::string>& interrupted = std::get<RunEnded>(events.back()).interrupted;
   if (!interrupted) return {};
   const auto* const began = std::get_if<RunStarted>(&events.front());
-  const std::string none = began != nullptr && began->ofExperiments ? "no experiment" : "no diagnostic";
-  return "the run was interrupted while " + (interrupted->empty() ? none : *interrupted) + " was running";
+  return "the run was interrupted while " + nameOfRunning(began == nullptr ? RunStarted{} : *began, *interrupted) +
+         " was running";
 }
 
 Finding verifyRecord(const std::filesystem::path& file, VerificationProgress& progress) {
@@ -144,7 +146,7 @@ ExitCode verifyOne(const std::filesystem::path& file, const Options& options, Co
   for (const std::string& problem : finding.problems) answer += "WRONG  " + printable(problem) + "\n";
   if (!finding.counts.empty()) answer += finding.counts + ", " + problemCount(finding) + "\n";
   if (!finding.missing.empty()) answer += "The record is incomplete: " + finding.missing + ".\n";
-  if (!finding.interrupted.empty()) answer += "T" + printable(finding.interrupted.substr(1)) + ".\n";
+  if (!finding.interrupted.empty()) answer += capitalized(printable(finding.interrupted)) + ".\n";
   writeOutput(options.report, console, answer);
   return finding.code;
 }

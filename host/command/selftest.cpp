@@ -1,5 +1,6 @@
 #include "host/command/selftest.h"
 
+#include "base/text/letter_case.h"
 #include "contract/message_format.h"
 #include "contract/ordered_map.h"
 #include "host/error/host_error.h"
@@ -15,8 +16,6 @@ namespace quazor {
 using Json = nlohmann::ordered_json;
 
 namespace {
-
-bool isOfHost(const DiagnosticErrorPtr& error) { return error != nullptr && error->domain() == QuazorHostErrorDomain; }
 
 std::string errorText(const std::optional<ExpectedError>& error) {
   return error ? formatMessage("%@ code %@: %@", error->domain, error->code, error->message) : std::string("no error");
@@ -68,7 +67,7 @@ OrderedMap<Counts> countsOf(const std::vector<SelftestRow>& rows, const std::vec
     const std::string& name = rows[i].expected.name;
     if (!all.contains(name)) all.set(name, {});
     Counts& counts = *all.find(name);
-    const bool healthy = rows[i].expected.verdict == "pass";
+    const bool healthy = rows[i].expected.mustPass();
     ++(healthy ? counts.healthy : counts.faulty);
     if (verdicts[i] == SelftestVerdict::kDetected) ++counts.detected;
     if (verdicts[i] == SelftestVerdict::kFalseAlarm) ++counts.falseAlarms;
@@ -93,7 +92,7 @@ std::string_view nameOf(SelftestVerdict verdict) {
 
 std::string differenceOf(const ExpectedOutcome& expected, const DiagnosticRecord& record) {
   // The host's own error for a run that reported none says nothing about the phone.
-  const bool hostsWord = isOfHost(record.error) && !expected.error;
+  const bool hostsWord = isHostError(record.error) && !expected.error;
   const DiagnosticErrorPtr error = hostsWord ? nullptr : record.error;
   std::vector<Comparison> comparisons = {
       {"the verdict", expected.verdict, std::string(nameOf(record.verdict))},
@@ -123,7 +122,7 @@ std::vector<SelftestVerdict> verdictsOf(const std::vector<SelftestRow>& rows) {
   std::vector<SelftestVerdict> verdicts;
   for (const SelftestRow& row : rows) {
     const std::vector<std::uint64_t>& counts = *fired.find(row.scenario);
-    const bool healthy = row.expected.verdict == "pass";
+    const bool healthy = row.expected.mustPass();
     if (row.runs == 0 || std::find(counts.begin(), counts.end(), 0U) != counts.end()) {
       verdicts.push_back(SelftestVerdict::kInvalid);
     } else if (!healthy && row.passes > 0) {
@@ -206,15 +205,12 @@ Json selftestDocument(const SelftestOutcome& outcome) {
   Json json = Json::array();
   for (std::size_t i = 0; i < rows.size(); ++i) {
     const SelftestRow& row = rows[i];
-    std::string verdict(nameOf(verdicts[i]));
-    std::transform(verdict.begin(), verdict.end(), verdict.begin(),
-                   [](char unit) { return unit >= 'A' && unit <= 'Z' ? static_cast<char>(unit - 'A' + 'a') : unit; });
     json.push_back({{"phone", row.scenario},
                     {"name", row.expected.name},
                     {"expected", row.expected.verdict},
                     {"runs", row.runs},
                     {"asExpected", row.asExpected},
-                    {"outcome", verdict},
+                    {"outcome", withSmallLetters(nameOf(verdicts[i]))},
                     {"difference", row.difference.empty() ? Json() : Json(row.difference)},
                     {"faultsFired", row.faultsFired}});
   }

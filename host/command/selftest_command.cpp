@@ -158,16 +158,10 @@ class Selftest {
         refused.push_back({name, problem.what()});
       }
     }
-    const auto healthy = std::find_if(phones.begin(), phones.end(), [](const WantedPhone& one) {
-      return one.isReal && !one.summary.hasFaults && mustPass(one.summary);
-    });
+    const auto healthy = std::find_if(phones.begin(), phones.end(),
+                                      [](const WantedPhone& one) { return one.isReal && !one.summary.isFaulty(); });
     if (healthy != phones.end()) healthyMachine_ = healthy->file;
     return phones;
-  }
-
-  static bool mustPass(const ScenarioSummary& summary) {
-    return std::all_of(summary.expected.begin(), summary.expected.end(),
-                       [](const ExpectedOutcome& one) { return one.verdict == nameOf(Verdict::kPass); });
   }
 
   // The phone that the others of its kind are compared with. Of real ones, it is the first that must pass and declares
@@ -216,7 +210,7 @@ class Selftest {
     const std::vector<ExpectedOutcome>& expected = wanted.summary.expected;
     const bool saysSo = std::any_of(expected.begin(), expected.end(),
                                     [&wanted](const ExpectedOutcome& one) { return isNamedIn(wanted.file, one); });
-    return mustPass(wanted.summary) && saysSo && !wanted.summary.hasFaults ? PhoneKind::kChanged : PhoneKind::kFaulty;
+    return saysSo && !wanted.summary.isFaulty() ? PhoneKind::kChanged : PhoneKind::kFaulty;
   }
 
   // The diagnostics that `run --all` runs on the phone besides those of which its file expects something.
@@ -244,11 +238,10 @@ class Selftest {
   // Adds the rows of the phone and its detection. Returns false if it was interrupted; then it adds nothing.
   bool performPhone(const WantedPhone& wanted, SelftestOutcome& outcome) {
     const ScenarioSummary& summary = wanted.summary;
-    PhoneDetection phone{wanted.name, summary.title, kindOf(wanted)};
+    PhoneDetection phone{wanted.name, summary.title, kindOf(wanted), !summary.mustPass()};
     std::vector<SelftestRow> rows;
     for (const ExpectedOutcome& expected : summary.expected) {
       rows.push_back({wanted.name, expected, 0, 0, 0, {}, {}});
-      if (expected.verdict != nameOf(Verdict::kPass)) phone.isExpected = true;
     }
     std::vector<ExpectedOutcome> wantedRuns = summary.expected;
     // Of the other diagnostics the file of a changed phone does not say that they pass, and a real one may lack their

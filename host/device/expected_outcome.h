@@ -30,6 +30,9 @@ struct ExpectedOutcome {
   std::vector<std::string> failedResults;
   std::optional<std::uint64_t> images;  // the number of images in the auxiliary data; nothing: not compared
   std::string key;                      // of its entry in "expect"; not `name` if it is a run of an experiment
+
+  // False if the run should find a fault of the phone.
+  bool mustPass() const { return verdict == "pass"; }
 };
 
 // The expected outcomes of a scenario, in order; empty without the key "expect". Throws InputError, like JsonCursor, if

@@ -8,6 +8,7 @@
 
 #include <nlohmann/json.hpp>
 
+#include <algorithm>
 #include <cstdint>
 #include <filesystem>
 #include <functional>
@@ -71,6 +72,11 @@ struct ScenarioSummary {
   bool hasFaults = false;
   std::vector<SkipRule> absent{};
   std::vector<std::filesystem::path> bases{};  // the files that it is based on
+
+  // False if it expects that a run does not pass.
+  bool mustPass() const { return std::ranges::all_of(expected, &ExpectedOutcome::mustPass); }
+  // True if it declares a fault or expects one to be found.
+  bool isFaulty() const { return hasFaults || !mustPass(); }
 };
 
 // Prefix of a phone's name that selects the machine quazor runs on; the name of the binding file follows.

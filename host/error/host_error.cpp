@@ -9,6 +9,14 @@ DiagnosticErrorPtr hostError(HostErrorCode code, std::string message) {
   return errorWithMessage(QuazorHostErrorDomain, static_cast<std::int64_t>(code), std::move(message), nullptr);
 }
 
+bool isHostError(const DiagnosticErrorPtr& error) {
+  return error != nullptr && error->domain() == QuazorHostErrorDomain;
+}
+
+bool isHostError(const DiagnosticErrorPtr& error, HostErrorCode code) {
+  return isHostError(error) && error->code() == static_cast<std::int64_t>(code);
+}
+
 DiagnosticErrorPtr errorOfException(std::string_view operation, const std::exception_ptr& thrown) {
   std::string message(operation);
   try {

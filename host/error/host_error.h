@@ -38,6 +38,11 @@ enum class HostErrorCode : std::int64_t {
 
 DiagnosticErrorPtr hostError(HostErrorCode code, std::string message);
 
+// True if the host detected the error. False for null.
+bool isHostError(const DiagnosticErrorPtr& error);
+// The same, with this code.
+bool isHostError(const DiagnosticErrorPtr& error, HostErrorCode code);
+
 // The error for an exception thrown by a plug-in. `operation` is the name of the operation that threw.
 DiagnosticErrorPtr errorOfException(std::string_view operation, const std::exception_ptr& thrown);
 

@@ -15,6 +15,21 @@ namespace {
 
 DiagnosticErrorPtr otherError() { return errorWithMessage("Other", 9, "other", nullptr); }
 
+TEST(HostError, HasTheDomainAndItsCode) {
+  const DiagnosticErrorPtr error = hostError(HostErrorCode::kInterrupted, "text");
+  EXPECT_TRUE(isHostError(error));
+  EXPECT_TRUE(isHostError(error, HostErrorCode::kInterrupted));
+  EXPECT_FALSE(isHostError(error, HostErrorCode::kNotRecorded));
+}
+
+TEST(HostError, IsNoErrorOfAPluginWithTheSameCode) {
+  const auto code = static_cast<std::int64_t>(HostErrorCode::kInterrupted);
+  const DiagnosticErrorPtr error = errorWithMessage("Other", code, "text", nullptr);
+  EXPECT_FALSE(isHostError(error));
+  EXPECT_FALSE(isHostError(error, HostErrorCode::kInterrupted));
+  EXPECT_FALSE(isHostError(nullptr, HostErrorCode::kInterrupted));
+}
+
 TEST(CallPlugin, LeavesTheFailureAloneOnSuccessEvenWithAnError) {
   DiagnosticErrorPtr failure;
   EXPECT_TRUE(callPlugin("run", &failure, [](DiagnosticErrorPtr* error) {

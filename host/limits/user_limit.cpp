@@ -1,6 +1,7 @@
 #include "host/limits/user_limit.h"
 
 #include "base/text/input_error.h"
+#include "base/text/letter_case.h"
 #include "contract/message_format.h"
 #include "host/text/name_pattern.h"
 #include "host/text/parameter_number.h"
@@ -41,9 +42,7 @@ bool looksLikeNumber(std::string_view text) {
 
 // True for "nan", "inf" and "infinity", which an unquoted text means as numbers.
 bool looksLikeNonFinite(std::string_view text) {
-  std::string small(text);
-  std::transform(small.begin(), small.end(), small.begin(),
-                 [](unsigned char unit) { return static_cast<char>(std::tolower(unit)); });
+  const std::string small = withSmallLetters(text);
   return small == "nan" || small == "inf" || small == "infinity";
 }
 

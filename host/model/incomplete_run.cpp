@@ -10,15 +10,6 @@
 
 namespace quazor {
 
-namespace {
-
-bool saysItWasInterrupted(const DiagnosticRecord& record) {
-  return record.error != nullptr && record.error->domain() == QuazorHostErrorDomain &&
-         record.error->code() == static_cast<std::int64_t>(HostErrorCode::kInterrupted);
-}
-
-}  // namespace
-
 std::vector<PlannedDiagnostic> missingOf(const RunStarted& run, const std::vector<DiagnosticRecord>& records) {
   std::map<std::pair<std::string, std::uint64_t>, std::size_t> begun;
   for (const DiagnosticRecord& record : records) {
@@ -45,7 +36,8 @@ UnrecordedDiagnostics unrecordedDiagnosticsOf(const RunStarted& run, const std::
                                               const std::optional<std::string>& interrupted) {
   UnrecordedDiagnostics unrecorded;
   unrecorded.neverRun = missingOf(run, records);
-  if (!interrupted || (!records.empty() && saysItWasInterrupted(records.back()))) return unrecorded;
+  const bool isRecorded = !records.empty() && isHostError(records.back().error, HostErrorCode::kInterrupted);
+  if (!interrupted || isRecorded) return unrecorded;
   unrecorded.interrupted = *interrupted;
   const auto running = std::find_if(unrecorded.neverRun.begin(), unrecorded.neverRun.end(),
                                     [&interrupted](const PlannedDiagnostic& one) { return one.name == *interrupted; });
@@ -68,10 +60,15 @@ std::vector<DiagnosticRecord> withInterruptedOfAnalysis(const RunStarted& run, s
   return records;
 }
 
+std::string nameOfRunning(const RunStarted& run, const std::string& interrupted) {
+  if (!interrupted.empty()) return interrupted;
+  return run.ofExperiments ? "no experiment" : "no diagnostic";
+}
+
 DiagnosticErrorPtr interruptionOf(const RunStarted& run, const std::string& interrupted) {
-  const std::string idle =
-      run.ofExperiments ? "interrupted while no experiment was running" : "interrupted while no diagnostic was running";
-  return hostError(HostErrorCode::kInterrupted, interrupted.empty() ? idle : interrupted + " was interrupted");
+  return hostError(HostErrorCode::kInterrupted,
+                   interrupted.empty() ? "interrupted while " + nameOfRunning(run, interrupted) + " was running"
+                                       : interrupted + " was interrupted");
 }
 
 }  // namespace quazor

@@ -35,6 +35,9 @@ UnrecordedDiagnostics unrecordedDiagnosticsOf(const RunStarted& run, const std::
 std::vector<DiagnosticRecord> withInterruptedOfAnalysis(const RunStarted& run, std::vector<DiagnosticRecord> records,
                                                         const std::optional<std::string>& interrupted);
 
+// The name of the diagnostic or experiment that was running, or "no diagnostic" or "no experiment" if it is empty.
+std::string nameOfRunning(const RunStarted& run, const std::string& interrupted);
+
 // The error to report for an interruption that no record shows. `interrupted` is the diagnostic that was running, or
 // empty.
 DiagnosticErrorPtr interruptionOf(const RunStarted& run, const std::string& interrupted);

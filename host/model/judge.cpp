@@ -41,23 +41,17 @@ std::string validateLimit(const QZLimit& limit, const Measurement& measured) {
 }
 
 bool isInside(const QZLimit& limit, double value) {
-  if (const QZBound* lower = limit.lowerBound().get()) {
-    const double low = lower->value().value();
-    if (value < low || (value == low && lower->open())) return false;
-  }
-  if (const QZBound* upper = limit.upperBound().get()) {
-    const double high = upper->value().value();
-    if (value > high || (value == high && upper->open())) return false;
-  }
-  return true;
+  const QZBound* lower = limit.lowerBound().get();
+  const QZBound* upper = limit.upperBound().get();
+  return (lower == nullptr || isInsideLower(value, lower->value().value(), lower->open())) &&
+         (upper == nullptr || isInsideUpper(value, upper->value().value(), upper->open()));
 }
 
-// A limit of the user can only make the verdict stricter.
-void addTo(Judgement& judgement, const LimitCheck& check) {
-  if (check.passed || !check.counts() || judgement.problemCode) return;
-  judgement.verdict = Verdict::kFail;
-  if (check.problem.empty()) return;
-  judgement = {Verdict::kError, HostErrorCode::kCannotBeJudged, check.problem};
+// A result, or a limit of the user on it, can only make the verdict stricter. The first problem is kept.
+void addTo(Judgement& judgement, ResultVerdict verdict, const std::string& problem) {
+  if (judgement.problemCode) return;
+  if (verdict == ResultVerdict::kFail) judgement.verdict = Verdict::kFail;
+  if (verdict == ResultVerdict::kError) judgement = {Verdict::kError, HostErrorCode::kCannotBeJudged, problem};
 }
 
 }  // namespace
@@ -82,6 +76,10 @@ std::string_view nameOf(Verdict verdict) {
   return "error";
 }
 
+bool isInsideLower(double value, double bound, bool open) { return open ? value > bound : value >= bound; }
+
+bool isInsideUpper(double value, double bound, bool open) { return open ? value < bound : value <= bound; }
+
 JudgedResult judgeResult(QZMeasuredResult result) {
   const std::optional<QZLimit>& limit = result.limit();
   if (!limit || (limit->lowerBound() == nullptr && limit->upperBound() == nullptr)) return {std::move(result)};
@@ -101,14 +99,7 @@ Judgement judge(const std::vector<JudgedResult>& results) {
     return judgement;
   }
   judgement.verdict = Verdict::kPass;
-  for (const JudgedResult& one : results) {
-    if (one.verdict == ResultVerdict::kFail && judgement.verdict == Verdict::kPass) judgement.verdict = Verdict::kFail;
-    if (!one.problem.empty() && judgement.problem.empty()) {
-      judgement.problemCode = HostErrorCode::kCannotBeJudged;
-      judgement.problem = one.problem;
-    }
-  }
-  if (judgement.problemCode) judgement.verdict = Verdict::kError;
+  for (const JudgedResult& one : results) addTo(judgement, one.verdict, one.problem);
   return judgement;
 }
 
@@ -125,7 +116,7 @@ RecordJudgement judgeRecord(const DiagnosticRecord& record, bool completed) {
   }
   if (record.experimentOnly) return {Verdict::kPass, nullptr};
   Judgement judgement = judge(record.measuredResults);
-  for (const LimitCheck& check : limitChecksOf(record)) addTo(judgement, check);
+  for (const LimitCheck& check : limitChecksOf(record)) addTo(judgement, check.verdict(), check.problem);
   if (!judgement.problemCode) return {judgement.verdict, nullptr};
   return {Verdict::kError, hostError(*judgement.problemCode, judgement.problem)};
 }

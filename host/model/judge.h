@@ -24,6 +24,10 @@ enum class Verdict { kPass, kFail, kError, kSkip };
 std::string_view nameOf(ResultVerdict verdict);  // "pass", "fail", "error", "none"
 std::string_view nameOf(Verdict verdict);        // "pass", "fail", "error", "skip"
 
+// True if a value is on the inner side of an interval's bound. The bound itself is inside unless it is open.
+bool isInsideLower(double value, double bound, bool open);
+bool isInsideUpper(double value, double bound, bool open);
+
 // A measured result and its verdict.
 struct JudgedResult {
   QZMeasuredResult result;

@@ -10,7 +10,6 @@
 
 #include <algorithm>
 #include <cmath>
-#include <cstdint>
 #include <iterator>
 #include <optional>
 #include <sstream>
@@ -21,13 +20,13 @@ namespace {
 
 bool holds(LimitOperator comparison, double value, double other, double tolerance) {
   switch (comparison) {
-    case LimitOperator::kLess: return value < other;
-    case LimitOperator::kLessOrEqual: return value <= other;
-    case LimitOperator::kGreater: return value > other;
-    case LimitOperator::kGreaterOrEqual: return value >= other;
+    case LimitOperator::kLess: return isInsideUpper(value, other, true);
+    case LimitOperator::kLessOrEqual: return isInsideUpper(value, other, false);
+    case LimitOperator::kGreater: return isInsideLower(value, other, true);
+    case LimitOperator::kGreaterOrEqual: return isInsideLower(value, other, false);
     case LimitOperator::kEqual: break;
   }
-  return value >= other - tolerance && value <= other + tolerance;
+  return isInsideLower(value, other - tolerance, false) && isInsideUpper(value, other + tolerance, false);
 }
 
 // Performs one comparison, with one overload per kind of condition. They return why it is impossible, or nothing.
@@ -45,8 +44,8 @@ class Comparison {
   std::string operator()(const IntervalCondition& condition) {
     if (std::string problem = validate(condition.unit); !problem.empty()) return problem;
     const double value = measured_.value();
-    const bool aboveLower = condition.lowerOpen ? value > condition.lower : value >= condition.lower;
-    check_.passed = aboveLower && (condition.upperOpen ? value < condition.upper : value <= condition.upper);
+    check_.passed = isInsideLower(value, condition.lower, condition.lowerOpen) &&
+                    isInsideUpper(value, condition.upper, condition.upperOpen);
     return {};
   }
 
@@ -103,10 +102,14 @@ bool fitsAny(const UserLimit& limit, const DiagnosticRecord& record) {
 
 }  // namespace
 
+ResultVerdict LimitCheck::verdict() const {
+  if (passed || !counts()) return ResultVerdict::kPass;
+  return problem.empty() ? ResultVerdict::kFail : ResultVerdict::kError;
+}
+
 std::string_view LimitCheck::verdictName() const {
-  if (passed) return nameOf(ResultVerdict::kPass);
-  if (skipped) return nameOf(Verdict::kSkip);
-  return counts() && !problem.empty() ? nameOf(ResultVerdict::kError) : nameOf(limit.severity);
+  if (!passed && skipped) return nameOf(Verdict::kSkip);
+  return warns() ? nameOf(LimitSeverity::kWarn) : nameOf(verdict());
 }
 
 bool appliesTo(const UserLimit& limit, const std::string& diagnostic) {
@@ -142,7 +145,18 @@ bool hasFailedResult(const DiagnosticRecord& record) {
   return std::any_of(record.measuredResults.begin(), record.measuredResults.end(),
                      [](const JudgedResult& one) { return one.verdict == ResultVerdict::kFail; }) ||
          std::any_of(checks.begin(), checks.end(),
-                     [](const LimitCheck& check) { return !check.passed && check.counts() && check.problem.empty(); });
+                     [](const LimitCheck& check) { return check.verdict() == ResultVerdict::kFail; });
+}
+
+ResultVerdict verdictOf(const JudgedResult& one, const std::vector<LimitCheck>& checksOfIt) {
+  ResultVerdict verdict = one.verdict;
+  for (const LimitCheck& check : checksOfIt) {
+    const ResultVerdict added = check.verdict();
+    const bool isStricter = verdict == ResultVerdict::kNone || added == ResultVerdict::kError ||
+                            (added == ResultVerdict::kFail && verdict == ResultVerdict::kPass);
+    if (isStricter) verdict = added;
+  }
+  return verdict;
 }
 
 std::vector<LimitCheck> checksOfResult(const std::vector<LimitCheck>& checks, std::size_t index) {
@@ -206,8 +220,7 @@ std::vector<UserLimit> limitsWithoutResult(const std::vector<UserLimit>& limits,
 }
 
 bool isOfLimit(const DiagnosticRecord& record) {
-  return record.experimentName.empty() && record.error != nullptr && record.error->domain() == QuazorHostErrorDomain &&
-         record.error->code() == static_cast<std::int64_t>(HostErrorCode::kLimitWithoutResult);
+  return record.experimentName.empty() && isHostError(record.error, HostErrorCode::kLimitWithoutResult);
 }
 
 namespace {

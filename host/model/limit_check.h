@@ -26,6 +26,9 @@ struct LimitCheck {
 
   // False if a failure only causes a warning.
   bool counts() const { return limit.severity == LimitSeverity::kFail; }
+  // What the check adds to the verdict on its result: kPass unless it counts and did not pass, kError if the result
+  // cannot be compared.
+  ResultVerdict verdict() const;
   // True if it causes a warning.
   bool warns() const { return !passed && !skipped && !counts(); }
   // "pass", "fail", "error" if they cannot be compared, "warn", or "skip".
@@ -46,6 +49,9 @@ std::vector<LimitCheck> limitChecksOf(const DiagnosticRecord& record);
 
 // True if a result is outside its own limits or outside one of the user's, whatever else went wrong.
 bool hasFailedResult(const DiagnosticRecord& record);
+
+// The verdict on a result by its own limit and by the checks of it. A check can only make it stricter.
+ResultVerdict verdictOf(const JudgedResult& one, const std::vector<LimitCheck>& checksOfIt);
 
 // Those of `checks` that compare the result at `index`.
 std::vector<LimitCheck> checksOfResult(const std::vector<LimitCheck>& checks, std::size_t index);

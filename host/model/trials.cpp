@@ -18,10 +18,6 @@ std::uint64_t mixed(std::uint64_t number) {
   return number ^ (number >> 31);
 }
 
-bool isHostError(const DiagnosticError& error, HostErrorCode code) {
-  return error.domain() == QuazorHostErrorDomain && error.code() == static_cast<std::int64_t>(code);
-}
-
 bool isAnswer(Verdict verdict) { return verdict == Verdict::kPass || verdict == Verdict::kFail; }
 
 }  // namespace
@@ -40,8 +36,8 @@ bool hasTrials(const std::vector<DiagnosticRecord>& records) {
 bool mayTryAgain(const DiagnosticRecord& record) {
   if (record.verdict != Verdict::kError || record.error == nullptr) return false;
   const bool wasNotBegun = record.errorStage == Stage::kDescribe && record.stages.empty();
-  return !wasNotBegun && !isHostError(*record.error, HostErrorCode::kInterrupted) &&
-         !isHostError(*record.error, HostErrorCode::kNotRecorded) && !hasFailedResult(record);
+  return !wasNotBegun && !isHostError(record.error, HostErrorCode::kInterrupted) &&
+         !isHostError(record.error, HostErrorCode::kNotRecorded) && !hasFailedResult(record);
 }
 
 bool isSuperseded(const std::vector<DiagnosticRecord>& records, std::size_t index) {

@@ -17,12 +17,6 @@ namespace quazor {
 
 namespace {
 
-// True for the host's failure to write a record, which is independent of the diagnostic's events.
-bool isNotRecorded(const DiagnosticError& error) {
-  return error.domain() == QuazorHostErrorDomain &&
-         error.code() == static_cast<std::int64_t>(HostErrorCode::kNotRecorded);
-}
-
 std::string textOf(const DiagnosticErrorPtr& error) {
   if (error == nullptr) return "none";
   return formatMessage("%@ %@ '%@'", error->domain(), error->code(), error->localizedDescription());
@@ -176,7 +170,8 @@ class Verifier {
       add(record.name + " was skipped, but something of it is recorded");
     }
     const DiagnosticErrorPtr due = record.error == nullptr ? judged.error : nullptr;
-    if (hostError_ != nullptr && isNotRecorded(*hostError_)) {
+    // That a record could not be written is independent of the diagnostic's events.
+    if (isHostError(hostError_, HostErrorCode::kNotRecorded)) {
       judged.verdict = Verdict::kError;
     } else if (textOf(hostError_) != textOf(due)) {
       add(formatMessage("%@: the recorded error of quazor is %@, but the results, limits and errors give %@",

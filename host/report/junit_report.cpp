@@ -11,7 +11,6 @@
 #include "host/text/timestamp.h"
 
 #include <cstddef>
-#include <cstdint>
 #include <string_view>
 
 namespace quazor {
@@ -114,11 +113,6 @@ void addRun(JUnitProperties& properties, const RunStarted& run) {
   for (const auto& [key, value] : run.tags) properties.add("tag." + key, value);
 }
 
-bool isOfResult(const DiagnosticError& error) {
-  return error.domain() == QuazorHostErrorDomain &&
-         error.code() == static_cast<std::int64_t>(HostErrorCode::kCannotBeJudged);
-}
-
 void addTrial(JUnitProperties& properties, const Trial& trial) {
   if (trial.attempt > 0) properties.add("attempt", std::to_string(trial.attempt));
   if (trial.repetition > 0) properties.add("repetition", std::to_string(trial.repetition));
@@ -159,7 +153,7 @@ JUnitSuite suiteOf(const RunStarted& run, const DiagnosticRecord& record) {
   }
   if (record.experimentOnly && record.verdict == Verdict::kPass) addExperiment(suite, record);
   // If results cannot be judged, their own cases have the errors.
-  if (record.error != nullptr && !isOfResult(*record.error)) {
+  if (record.error != nullptr && !isHostError(record.error, HostErrorCode::kCannotBeJudged)) {
     suite.addError(std::string(errorStageText(record)), {}, record.error);
   }
   if (record.skip) suite.addSkipped(std::string(nameOf(record.skip->kind)), {}, record.skip->reason);

@@ -1,5 +1,6 @@
 #include "host/report/report_format.h"
 
+#include "base/text/letter_case.h"
 #include "base/text/nearest_name.h"
 #include "contract/message_format.h"
 #include "host/error/exit_code.h"
@@ -39,9 +40,7 @@ std::string textReport(const RunStarted& run, const std::vector<DiagnosticRecord
   }
   printEnd(text, run, records, interrupted, content, false);
   if (interrupted && (run.analyzed || !interrupted->empty())) {
-    std::string sentence = interruptionText(run, *interrupted);
-    sentence.front() = run.analyzed ? 'T' : 'I';
-    text << sentence << ".\n";
+    text << capitalized(interruptionText(run, *interrupted)) << ".\n";
   }
   return text.str();
 }
@@ -108,9 +107,7 @@ std::optional<Format> otherFormatOfSuffix(const OutputRequest& output) {
   constexpr std::pair<std::string_view, Format> kSuffixes[] = {
       {".txt", Format::kText}, {".log", Format::kText},  {".json", Format::kJson}, {".jsonl", Format::kOcp},
       {".csv", Format::kCsv},  {".xml", Format::kJunit}, {".html", Format::kHtml}, {".htm", Format::kHtml}};
-  std::string suffix = output.file.extension().string();
-  std::transform(suffix.begin(), suffix.end(), suffix.begin(),
-                 [](char unit) { return unit >= 'A' && unit <= 'Z' ? static_cast<char>(unit - 'A' + 'a') : unit; });
+  const std::string suffix = withSmallLetters(output.file.extension().string());
   const auto* const found = std::find_if(std::begin(kSuffixes), std::end(kSuffixes),
                                          [&suffix](const auto& one) { return one.first == suffix; });
   if (found == std::end(kSuffixes) || found->second == output.format) return std::nullopt;

@@ -2,6 +2,7 @@
 
 #include "contract/message_format.h"
 #include "host/device/phone.h"
+#include "host/model/incomplete_run.h"
 #include "host/report/csv_report.h"
 #include "host/text/table.h"
 #include "host/text/timestamp.h"
@@ -85,11 +86,8 @@ void printRun(std::ostream& out, const RunStarted& run) {
 }
 
 std::string interruptionText(const RunStarted& run, const std::string& interrupted) {
-  const std::string running = !interrupted.empty() ? printable(interrupted)
-                              : run.ofExperiments  ? "no experiment"
-                                                   : "no diagnostic";
   return (run.analyzed ? "the recorded run did not come to its end: it stopped while " : "interrupted while ") +
-         running + " was running";
+         printable(nameOfRunning(run, interrupted)) + " was running";
 }
 
 std::string withRunColumns(const std::string& csv, const RunStarted& run, const std::vector<std::uint64_t>& seeds) {

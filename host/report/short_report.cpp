@@ -22,17 +22,6 @@ namespace {
 // Telling more would push the other diagnostics off the screen.
 constexpr std::size_t kMaxNamed = 3;
 
-// The verdict on a result by its own limit and those of the user that count.
-ResultVerdict verdictOf(const JudgedResult& one, const std::vector<LimitCheck>& checksOfIt) {
-  ResultVerdict verdict =
-      checksOfIt.empty() || one.verdict != ResultVerdict::kNone ? one.verdict : ResultVerdict::kPass;
-  for (const LimitCheck& check : checksOfIt) {
-    if (check.passed || !check.counts() || verdict == ResultVerdict::kError) continue;
-    verdict = check.problem.empty() ? ResultVerdict::kFail : ResultVerdict::kError;
-  }
-  return verdict;
-}
-
 std::vector<ResultVerdict> verdictsOf(const DiagnosticRecord& record, const std::vector<LimitCheck>& checks) {
   std::vector<ResultVerdict> verdicts;
   for (std::size_t i = 0; i < record.measuredResults.size(); ++i) {

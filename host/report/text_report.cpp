@@ -10,7 +10,6 @@
 #include "host/text/table.h"
 
 #include <algorithm>
-#include <cstdint>
 #include <string_view>
 #include <utility>
 
@@ -200,11 +199,8 @@ std::string errorText(const DiagnosticErrorPtr& error, std::string_view indent) 
 std::string_view errorStageText(const DiagnosticRecord& record) {
   if (record.error == nullptr) return {};
   if (record.errorStage) return nameOf(*record.errorStage);
-  const auto isHostError = [&record](HostErrorCode code) {
-    return record.error->domain() == QuazorHostErrorDomain && record.error->code() == static_cast<std::int64_t>(code);
-  };
-  if (isHostError(HostErrorCode::kNotRecorded)) return "record";
-  return isHostError(HostErrorCode::kInterrupted) ? std::string_view() : nameOf(Stage::kAnalyze);
+  if (isHostError(record.error, HostErrorCode::kNotRecorded)) return "record";
+  return isHostError(record.error, HostErrorCode::kInterrupted) ? std::string_view() : nameOf(Stage::kAnalyze);
 }
 
 void printResults(std::ostream& out, const DiagnosticRecord& record, ResultRows rows, bool colour) {

@@ -55,9 +55,7 @@ class OneAtATime final : public RunEventSink {
 // Only the log can tell the cause of a failure without an error. A longer line is cut between two characters.
 DiagnosticErrorPtr withErrorLine(DiagnosticErrorPtr failure, std::string line) {
   constexpr std::size_t kMaxQuoted = 500;
-  const bool isWithoutError = failure->domain() == QuazorHostErrorDomain &&
-                              failure->code() == static_cast<std::int64_t>(HostErrorCode::kNoErrorGiven);
-  if (!isWithoutError || line.empty()) return failure;
+  if (!isHostError(failure, HostErrorCode::kNoErrorGiven) || line.empty()) return failure;
   if (line.size() > kMaxQuoted) {
     std::size_t end = kMaxQuoted;
     while (end > 0 && continuesUtf8(line[end])) --end;

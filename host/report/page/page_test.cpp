@@ -127,6 +127,18 @@ TEST(ReportPage, SaysThatARunDidNotComeToItsEnd) {
   EXPECT_THAT(run.page(), Not(HasSubstr("class=\"stop\"")));
 }
 
+TEST(ReportPage, SaysWhetherAnAnalysisOrTheRecordedRunDidNotComeToItsEnd) {
+  SampleRun run({recordOf("A", Verdict::kPass)});
+  run.began.analyzed = AnalyzedRun{};
+  ShownRun shown = run.shown();
+  shown.interrupted = "A";
+  EXPECT_THAT(reportPage({shown}, {}), HasSubstr("<p class=\"stop\">The recorded run did not come to its end: it "
+                                                 "stopped while A was running.</p>"));
+  shown.hasEnded = false;
+  EXPECT_THAT(reportPage({shown}, {}),
+              HasSubstr("<p class=\"stop\">The run did not come to its end: it stopped while A was running.</p>"));
+}
+
 TEST(ReportPage, OfSeveralRunsHasATableFirst) {
   const SampleRun good({recordOf("A", Verdict::kPass)});
   const SampleRun bad({recordOf("A", Verdict::kFail)});

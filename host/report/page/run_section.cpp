@@ -1,5 +1,6 @@
 #include "host/report/page/run_section.h"
 
+#include "base/text/letter_case.h"
 #include "contract/message_format.h"
 #include "host/model/incomplete_run.h"
 #include "host/model/trials.h"
@@ -216,8 +217,9 @@ std::string stopLine(const ShownRun& run) {
     why = "it stopped while " + *run.interrupted + " was running";
   }
   if (run.hasEnded && !run.interrupted) return {};
-  std::string text = run.began.analyzed && run.interrupted ? "T" + why.substr(1) : "The run did not come to its end";
-  if (!run.began.analyzed && !why.empty()) text += ": " + why;
+  const bool saysItAll = run.hasEnded && run.began.analyzed.has_value();
+  std::string text = saysItAll ? capitalized(why) : "The run did not come to its end";
+  if (!saysItAll && !why.empty()) text += ": " + why;
   return element("p class=\"stop\"", htmlText(text) + ".") + "\n";
 }
 
