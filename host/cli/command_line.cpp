@@ -242,7 +242,7 @@ ReportOptions reportOf(const RawOptions& raw, bool isOfRun) {
   report.format = *formatNamed(raw.format);
   for (const std::string& text : raw.outputs) {
     OutputRequest output = isOfRun ? parseOutput(text, report.format) : OutputRequest{report.format, text};
-    if (output.file.empty()) throw CommandError(ExitCode::kUsage, "--output '" + text + "': the file name is missing");
+    refuseNoFile(text, output);
     if (output.file != text) {
       report.outputs.push_back(std::move(output));
     } else if (report.output.empty()) {

@@ -274,6 +274,12 @@ TEST(ParseCommandLine, RefusesWrongUsage) {
        "--output 'x' and --output 'y': name the format of each additional report, as in --output junit:FILE"},
       {{"list", "--output", "x", "--output", "y"}, "--output 'x' and --output 'y': this command writes only one file"},
       {{"run", "A", "--output", "json:"}, "--output 'json:': the file name is missing"},
+      {{"run", "A", "--output", "json:-"},
+       "--output 'json:-': for a report on standard output, use --format json without --output (for a file of this "
+       "name, "
+       "write 'json:./-')"},
+      {{"list", "--output", "-"},
+       "--output '-': for a report on standard output, leave --output out (for a file of this name, write './-')"},
       {{"run", "A", "--parameters", ""}, "--parameters: the value is empty"},
       {{"run", "A", "--record", ""}, "--record: the value is empty"},
       {{"run", "--only", "failed", "--of", ""}, "--of: the value is empty"},
@@ -347,6 +353,13 @@ std::vector<std::string> linesAfter(const std::string& prefix, const std::string
     if (line.starts_with(prefix)) found.push_back(line.substr(prefix.size()));
   }
   return found;
+}
+
+TEST(Help, SaysWhatAnIncompleteRecordIsForEachCommand) {
+  EXPECT_THAT(linesAfter("  3    ", parse({"verify", "--help"}).out),
+              testing::ElementsAre("the record has no end of a run; one that was interrupted and ended has one"));
+  EXPECT_THAT(linesAfter("  3    ", parse({"analyze", "--help"}).out),
+              testing::ElementsAre("all passed, but the recorded run was interrupted or did not end"));
 }
 
 TEST(Help, OfACommandHasItsOwnExamplesAndExitCodes) {

@@ -63,7 +63,8 @@ constexpr ExitCodeHelp kExitCodes[] = {
     {1, "a problem was found", "verify diff selftest"},
     {2, "a diagnostic or experiment ended in an error, or was skipped without --allow-skips", "run experiment"},
     {2, "a diagnostic or experiment ended in an error", "analyze describe"},
-    {3, "a record is incomplete, because its run did not end", "verify analyze"},
+    {3, "the record has no end of a run; one that was interrupted and ended has one", "verify"},
+    {3, "all passed, but the recorded run was interrupted or did not end", "analyze"},
     {64, "the command line is invalid", {}},
     {66, "a plug-in, scenario, binding, profile or record cannot be read or loaded",
      "list describe run experiment verify analyze diff report explain doctor selftest phone new"},
@@ -113,8 +114,9 @@ std::string helpFooter() {
   add(0, "all diagnostics passed, or all experiments returned a result");
   add(1, "a result was outside its limits, or verify, diff or selftest found a problem");
   for (const ExitCodeHelp& one : kExitCodes) {
-    if (one.code < 2 || one.commands == "analyze describe") continue;  // told with run
-    add(one.code, one.code == 3 ? "verify, analyze: a record is incomplete, because its run did not end" : one.meaning);
+    if (one.code < 2 || one.commands.starts_with("analyze")) continue;  // told with run
+    add(one.code,
+        one.code == 3 ? "the run of the record did not end, or, for analyze, it was interrupted" : one.meaning);
   }
   return "Without --phone, the phone is a simulated, healthy one.\n"
          "The manual page is quazor(1); share/doc/quazor/index.md in the installation lists the documents.\n\n" +

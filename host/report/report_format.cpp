@@ -103,6 +103,19 @@ OutputRequest parseOutput(const std::string& text, Format usual) {
                                            didYouMean(word, formatNames()));
 }
 
+void refuseNoFile(const std::string& text, const OutputRequest& output) {
+  const std::string file = output.file.string();
+  if (file.empty()) throw CommandError(ExitCode::kUsage, "--output '" + text + "': the file name is missing");
+  if (file != "-") return;
+  const std::string prefix = text.substr(0, text.size() - file.size());
+  const std::string instead =
+      prefix.empty() ? "leave --output out" : formatMessage("use --format %@ without --output", nameOf(output.format));
+  throw CommandError(ExitCode::kUsage,
+                     formatMessage("--output '%@': for a report on standard output, %@ (for a file of "
+                                   "this name, write '%@./-')",
+                                   text, instead, prefix));
+}
+
 std::optional<Format> otherFormatOfSuffix(const OutputRequest& output) {
   constexpr std::pair<std::string_view, Format> kSuffixes[] = {
       {".txt", Format::kText}, {".log", Format::kText},  {".json", Format::kJson}, {".jsonl", Format::kOcp},

@@ -41,6 +41,9 @@ struct OutputRequest {
 // format, or for FILE:FORMAT.
 OutputRequest parseOutput(const std::string& text, Format usual);
 
+// Throws a CommandError (kUsage) if `output`, which was given as `text`, has no file or "-" for one.
+void refuseNoFile(const std::string& text, const OutputRequest& output);
+
 // The format that the suffix of the file suggests, if the report has another; nothing for other suffixes.
 std::optional<Format> otherFormatOfSuffix(const OutputRequest& output);
 
