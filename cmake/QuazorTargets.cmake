@@ -128,8 +128,15 @@ function(quazor_plugin name)
   if(QUAZOR_SANITIZE AND CMAKE_CXX_COMPILER_ID MATCHES Clang)
     target_link_options(${name} PRIVATE -Wl,-z,undefs)  # clang resolves the sanitizer's runtime in the program
   endif()
-  set_target_properties(${name} PROPERTIES PREFIX "" INSTALL_RPATH "$ORIGIN/.."
+  set_target_properties(${name} PROPERTIES PREFIX "" INSTALL_RPATH "$ORIGIN/.." DEFINE_SYMBOL ""
                         LIBRARY_OUTPUT_DIRECTORY ${PROJECT_BINARY_DIR}/${QUAZOR_PLUGIN_DIRECTORY})
+  file(RELATIVE_PATH folder ${PROJECT_SOURCE_DIR} ${CMAKE_CURRENT_SOURCE_DIR})
+  if(folder MATCHES "^tests")
+    quazor_compile_quickly(${name})
+    quazor_precompile(${name} json)
+  else()
+    quazor_precompile(${name} plain)
+  endif()
 endfunction()
 
 # For tests and what only they use: what is seldom run is compiled quickly.
@@ -141,6 +148,17 @@ function(quazor_compile_quickly target)
   if(QUAZOR_SANITIZE MATCHES undefined AND NOT folder MATCHES "^(contract|platform|base)")
     target_compile_options(${target} PRIVATE -fno-sanitize=undefined)
   endif()
+endfunction()
+
+# quazor_test_program(NAME SOURCES ... DEPENDS ...): a program that tests run, in the directory `tests` of the build tree.
+function(quazor_test_program name)
+  cmake_parse_arguments(ARG "" "" "SOURCES;DEPENDS" ${ARGN})
+  add_executable(${name} ${ARG_SOURCES})
+  target_link_libraries(${name} PRIVATE ${ARG_DEPENDS})
+  quazor_configure(${name})
+  quazor_compile_quickly(${name})
+  quazor_precompile(${name} program ${QUAZOR_COMMON_HEADERS} <nlohmann/json.hpp>)
+  set_target_properties(${name} PROPERTIES RUNTIME_OUTPUT_DIRECTORY ${PROJECT_BINARY_DIR}/tests)
 endfunction()
 
 # quazor_test(NAME SOURCES ... DEPENDS ...): a GoogleTest program and its CTest entry.

@@ -39,6 +39,11 @@ Value::Value(const char* text) : Value(std::string(text)) {}
 Value::Value(Array elements) : data_(held(std::move(elements))) {}
 Value::Value(Dictionary entries) : data_(held(std::move(entries))) {}
 Value::Value(Bytes bytes) : data_(std::make_shared<const Bytes>(std::move(bytes))) {}
+Value::Value(const Value& other) = default;
+Value::Value(Value&& other) noexcept = default;
+Value& Value::operator=(const Value& other) = default;
+Value& Value::operator=(Value&& other) noexcept = default;
+Value::~Value() = default;
 
 std::shared_ptr<Object> Value::object() const {
   const auto* pointer = std::get_if<std::shared_ptr<Object>>(&data_);

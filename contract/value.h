@@ -94,6 +94,12 @@ class QUAZOR_EXPORT Value {
   template <std::derived_from<Object> O>
   Value(std::shared_ptr<O> object) : data_(std::shared_ptr<Object>(std::move(object))) {}
   Value(DiagnosticErrorPtr error) : data_(std::move(error)) {}
+  // Compiled once, in the library: in every source that holds Values they would take up to a quarter of its compilation.
+  Value(const Value& other);
+  Value(Value&& other) noexcept;
+  Value& operator=(const Value& other);
+  Value& operator=(Value&& other) noexcept;
+  ~Value();
 
   Kind kind() const { return static_cast<Kind>(data_.index()); }
   bool isNumber() const { return kind() <= Kind::kFloat; }

@@ -18,9 +18,10 @@
 
 namespace quazor {
 
+using Json = nlohmann::ordered_json;
+
 namespace {
 
-using Json = nlohmann::ordered_json;
 using std::chrono::nanoseconds;
 
 // The rows of a diagnostic; the streams follow, each with a row of its own.
