@@ -43,7 +43,7 @@ std::string tableOf(const std::string& name, const Dictionary& rows) {
     }
   }
   std::string head = element("th scope=\"col\"", "Of");
-  for (const std::string& column : columns) head += element("th scope=\"col\"", breakableName(column));
+  for (const std::string& column : columns) head += element("th scope=\"col\" class=\"number\"", breakableName(column));
   std::string body;
   for (const auto& [rowName, row] : rows) {
     std::string cells = element("th scope=\"row\"", breakableName(rowName));

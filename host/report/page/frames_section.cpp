@@ -11,12 +11,15 @@
 #include <cstdint>
 #include <iterator>
 #include <optional>
+#include <string_view>
 
 namespace quazor {
 
 namespace {
 
 constexpr double kPerMillisecond = 1e6;  // nanoseconds
+constexpr std::string_view kMasterMark =
+    " <-- sync master";  // after the camera's name in the log of a group of cameras
 constexpr double kPerSecond = 1e9;
 constexpr double kLeastSpan = 0.1;  // milliseconds: a plot shows frames that are late, not the steps of a clock
 
@@ -236,6 +239,22 @@ std::string framesSection(const std::vector<RecordedStream>& streams, int level,
          "</th><th scope=\"col\">Capture to delivery</th><th scope=\"col\">Delivery to "
          "return</th></tr></thead><tbody>" +
          rows + "</tbody></table>\n" + details;
+}
+
+std::string camerasParagraph(const DiagnosticRecord& record, const std::vector<RecordedStream>& streams) {
+  std::string names;
+  for (const RecordedStream& stream : streams) {
+    if (!stream.frames.empty()) names += (names.empty() ? "" : ", ") + stream.name;
+  }
+  std::string text;
+  if (!names.empty()) text += "Frames from: " + names + ". ";
+  for (const LogLine& line : record.log) {
+    const std::size_t end = line.text.find(kMasterMark);
+    if (end == std::string::npos) continue;
+    text += "Master, which offsets between cameras refer to: " + line.text.substr(0, end) + ". ";
+    break;
+  }
+  return text.empty() ? text : element("p class=\"soft\"", htmlText(text.substr(0, text.size() - 1)));
 }
 
 std::string comparedIntervals(const RecordedStream& before, const RecordedStream& after) {

@@ -13,6 +13,10 @@ namespace quazor {
 // without frames.
 std::string framesSection(const std::vector<RecordedStream>& streams, int level, bool plots);
 
+// Which cameras the diagnostic saw: the streams that delivered frames to it, and the master that its log names, which
+// offsets between cameras refer to. Empty if neither is known.
+std::string camerasParagraph(const DiagnosticRecord& record, const std::vector<RecordedStream>& streams);
+
 // A sentence, a table and a plot of the intervals between the frames of two recordings of one stream.
 std::string comparedIntervals(const RecordedStream& before, const RecordedStream& after);
 

@@ -64,6 +64,17 @@ TEST(FramesSection, MarksCaptureTimesThatGoBack) {
   EXPECT_THAT(html, HasSubstr("class=\"mark\""));
 }
 
+TEST(CamerasParagraph, NamesStreamsAndMaster) {
+  DiagnosticRecord record;
+  EXPECT_EQ(camerasParagraph(record, {}), "");
+  EXPECT_EQ(camerasParagraph(record, {streamOf("wide", {{0, 0}}), streamOf("<tele>", {{0, 0}}), streamOf("dead", {})}),
+            "<p class=\"soft\">Frames from: wide, &lt;tele&gt;.</p>");
+  record.log = {{{}, LogLevel::kDefault, "first"},
+                {{}, LogLevel::kDefault, "FrontCamera <-- sync master\n  Offset: 0\n"}};
+  EXPECT_EQ(camerasParagraph(record, {}),
+            "<p class=\"soft\">Master, which offsets between cameras refer to: FrontCamera.</p>");
+}
+
 TEST(FramesSection, CanBeWithoutPlots) {
   EXPECT_THAT(framesSection({streamOf("wide", {{0, 0}, {1, 33}})}, 3, false), Not(HasSubstr("<svg")));
 }

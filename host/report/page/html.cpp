@@ -24,14 +24,15 @@ std::string htmlText(std::string_view text) { return xmlAttribute(printable(text
 
 std::string htmlLines(std::string_view text) { return xmlText(printableLines(text)); }
 
-std::string htmlProse(std::string_view text) {
+std::string htmlProse(std::string_view text, const std::function<std::string(const std::string& code)>& typed) {
   std::string html;
   while (true) {
     const std::size_t begin = text.find('`');
     const std::size_t end = begin == std::string_view::npos ? begin : text.find('`', begin + 1);
     if (end == std::string_view::npos) return html + htmlText(text);
     html += htmlText(text.substr(0, begin));
-    html += element("code", htmlText(text.substr(begin + 1, end - begin - 1)));
+    const std::string code(text.substr(begin + 1, end - begin - 1));
+    html += typed ? typed(code) : element("code", htmlText(code));
     text.remove_prefix(end + 1);
   }
 }

@@ -2,6 +2,7 @@
 #pragma once
 
 #include <cstddef>
+#include <functional>
 #include <string>
 #include <string_view>
 
@@ -14,8 +15,8 @@ std::string htmlText(std::string_view text);
 // The same for a text of several lines, which keeps its newlines and tabs.
 std::string htmlLines(std::string_view text);
 
-// Prose, in which `back quotes` enclose what is typed.
-std::string htmlProse(std::string_view text);
+// Prose, in which `back quotes` enclose what is typed. `typed` makes its HTML; without it, it is <code>.
+std::string htmlProse(std::string_view text, const std::function<std::string(const std::string& code)>& typed = {});
 
 // <tag>content</tag>. The tag may have attributes, as in "td class=\"value\"". `content` is HTML.
 std::string element(std::string_view tag, std::string_view content);

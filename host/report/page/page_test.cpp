@@ -72,6 +72,16 @@ TEST(ReportPage, SaysWhatToDo) {
   EXPECT_THAT(asked, testing::Contains("Count"));
 }
 
+TEST(ReportPage, SaysWhatTheRunAlreadyShows) {
+  const Advice advice{"Title", "", "Failing.", {}, {"Run `quazor run B`, then `quazor run NAME`."}};
+  PageOptions options;
+  options.adviceOf = [&](const std::string&) { return &advice; };
+  EXPECT_THAT(
+      SampleRun({recordOf("A", Verdict::kFail), recordOf("B", Verdict::kPass)}).page(options),
+      HasSubstr("<li>Run <code>quazor run B --phone phone.json</code> <em>(already run here: passed)</em>, then "
+                "<code>quazor run A --phone phone.json</code>.</li>"));
+}
+
 TEST(ReportPage, HasEveryPartOfADiagnostic) {
   SampleRun run({recordOf("A", Verdict::kError)});
   run.records[0].stages = {{Stage::kRun, Date(), Date() + std::chrono::seconds(1)}, {Stage::kTeardown, Date(), {}}};

@@ -113,10 +113,10 @@ std::string rowsOf(const Group& group, Columns columns) {
   for (const Row& row : group.rows) {
     const bool isOutside = row.verdict == "fail" || row.verdict == "warn";
     const std::string deviation = isOutside ? deviationText(measurement.value(), row.bounds) : std::string();
+    cells += element("td", verdictBadge(row.verdict) + (deviation.empty() ? "" : element("small", deviation)));
     cells += element("td", htmlText(row.limit));
     if (columns.source) cells += sourceCell(row);
     if (columns.bar) cells += element("td", barOf(row, measurement.value()));
-    cells += element("td", verdictBadge(row.verdict) + (deviation.empty() ? "" : element("small", deviation)));
     html += element(isOutside || row.verdict == "error" ? "tr class=\"bad\"" : "tr", cells) + "\n";
     cells.clear();
   }
@@ -164,10 +164,11 @@ std::string resultsTable(const DiagnosticRecord& record) {
   std::string rows;
   for (const Group* const group : ordered) rows += rowsOf(*group, columns);
   return "<table class=\"results\"><caption>Results and their limits</caption><thead><tr><th scope=\"col\">Result</th>"
-         "<th scope=\"col\">Value</th><th scope=\"col\">Unit</th><th scope=\"col\">Limit</th>" +
+         "<th scope=\"col\" class=\"number\">Value</th><th scope=\"col\">Unit</th><th scope=\"col\">Verdict</th>"
+         "<th scope=\"col\">Limit</th>" +
          std::string(columns.source ? "<th scope=\"col\">Limit from</th>" : "") +
-         (columns.bar ? "<th scope=\"col\">In the limit</th>" : "") +
-         "<th scope=\"col\">Verdict</th></tr></thead>\n<tbody>\n" + rows + "</tbody></table>\n";
+         (columns.bar ? "<th scope=\"col\">In the limit</th>" : "") + "</tr></thead>\n<tbody>\n" + rows +
+         "</tbody></table>\n";
 }
 
 std::vector<std::string> failureSentences(const DiagnosticRecord& record) {

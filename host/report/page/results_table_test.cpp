@@ -54,9 +54,11 @@ TEST(ResultsTable, HasAllLimitsOfAResultInOneGroup) {
   record.measuredResults = judgeResults({limitedResult("Count", 90, 90)});
   const std::string table = resultsTable(record);
   EXPECT_THAT(table, HasSubstr("<th scope=\"row\" rowspan=\"2\">Count</th><td class=\"number\" rowspan=\"2\">90</td>"
-                               "<td rowspan=\"2\">frames</td><td>Enough: &gt;= 90</td><td class=\"soft\">the "
-                               "plug-in</td>"));
-  EXPECT_THAT(table, HasSubstr("<tr class=\"bad\"><td>Count &gt;= 95</td><td>profile strict.json</td>"));
+                               "<td rowspan=\"2\">frames</td><td><span class=\"badge pass\">"));
+  EXPECT_THAT(table, HasSubstr("<td>Enough: &gt;= 90</td><td class=\"soft\">the plug-in</td>"));
+  EXPECT_THAT(table, HasSubstr("<tr class=\"bad\"><td><span class=\"badge fail\">"));
+  EXPECT_THAT(table,
+              HasSubstr("<small>5 below the limit</small></td><td>Count &gt;= 95</td><td>profile strict.json</td>"));
   EXPECT_THAT(failureSentences(record),
               testing::ElementsAre("<strong>Count</strong> is <strong>90 frames</strong>, <strong>5 below the "
                                    "limit</strong> (Count &gt;= 95 (profile strict.json)). The plug-in's own limit is "

@@ -5,6 +5,7 @@
 #include "host/model/incomplete_run.h"
 #include "host/model/trials.h"
 #include "host/report/experiment_report.h"
+#include "host/report/page/advised_command.h"
 #include "host/report/page/details.h"
 #include "host/report/page/frames_section.h"
 #include "host/report/page/html.h"
@@ -32,38 +33,54 @@ std::string idOf(std::size_t run, std::size_t record) {
   return "run" + std::to_string(run) + "-" + std::to_string(record + 1);
 }
 
+const std::vector<RecordedStream>& streamsOf(const ShownRun& run, std::size_t index) {
+  static const std::vector<RecordedStream> none;
+  return index < run.streams.size() ? run.streams[index] : none;
+}
+
 std::string titleOf(const DiagnosticRecord& record) {
   const std::string trial = trialTextWithSeed(record);
   return htmlName(record.name) + (trial.empty() ? "" : " " + element("span class=\"soft\"", "(" + trial + ")")) + " " +
          verdictBadge(nameOf(record.verdict));
 }
 
-std::string listOf(std::string_view tag, const std::vector<std::string>& texts) {
+// An explanation with commands that fit the run, and with what the run already shows of them.
+std::string proseOf(const std::string& text, const Explained& explained) {
+  return htmlProse(text, [&explained](const std::string& code) {
+    const std::string known = knownOfCommand(code, explained);
+    return element("code", htmlText(fittedCommand(code, explained))) +
+           (known.empty() ? known : " " + element("em", "(" + known + ")"));
+  });
+}
+
+std::string listOf(std::string_view tag, const std::vector<std::string>& texts, const Explained& explained) {
   std::string items;
-  for (const std::string& text : texts) items += element("li", htmlProse(text));
+  for (const std::string& text : texts) items += element("li", proseOf(text, explained));
   return element(tag, items);
 }
 
-std::string adviceText(const Advice& advice, int level) {
+std::string adviceText(const Advice& advice, int level, const Explained& explained) {
   std::string html = element("p", element("strong", htmlText(advice.title)) + ". " +
-                                      htmlProse(advice.failing.empty() ? advice.meaning : advice.failing));
-  if (!advice.causes.empty()) html += heading(level, "Likely causes") + listOf("ul", advice.causes);
-  if (!advice.next.empty()) html += heading(level, "What to do next") + listOf("ol", advice.next);
+                                      proseOf(advice.failing.empty() ? advice.meaning : advice.failing, explained));
+  if (!advice.causes.empty()) html += heading(level, "Likely causes") + listOf("ul", advice.causes, explained);
+  if (!advice.next.empty()) html += heading(level, "What to do next") + listOf("ol", advice.next, explained);
   return html;
 }
 
 // Writes the findings of a run. Thread: one at a time.
 class FindingWriter {
  public:
-  // All are borrowed; `level` is the heading of a finding.
-  FindingWriter(std::size_t run, int level, const PageOptions& options) : run_(run), level_(level), options_(options) {}
+  // The run and the options are borrowed; `number` is that of the run, `level` the heading of a finding.
+  FindingWriter(const ShownRun& run, std::size_t number, int level, const PageOptions& options)
+      : run_(run), number_(number), level_(level), options_(options) {}
 
   std::string text(const DiagnosticRecord& record, std::size_t index);
 
  private:
   std::string adviceOn(const DiagnosticRecord& record, const std::string& id);
 
-  const std::size_t run_;
+  const ShownRun& run_;
+  const std::size_t number_;
   const int level_;
   const PageOptions& options_;
   std::map<const Advice*, std::string> given_;  // where the page has it
@@ -84,7 +101,7 @@ std::string FindingWriter::adviceOn(const DiagnosticRecord& record, const std::s
     if (!isNew && given->second == id) continue;
     ++found;
     if (isNew) {
-      html += adviceText(*advice, level_ + 1);
+      html += adviceText(*advice, level_ + 1, {run_, record});
       html +=
           element("p class=\"soft\"", "More: " + element("code", htmlText("quazor explain " + shellWord(topics[i]))));
     } else {
@@ -108,7 +125,7 @@ std::string errorParagraphs(const DiagnosticRecord& record) {
 
 // What did not pass of a diagnostic, and what to do about it.
 std::string FindingWriter::text(const DiagnosticRecord& record, std::size_t index) {
-  const std::string id = idOf(run_, index);
+  const std::string id = idOf(number_, index);
   std::string what = errorParagraphs(record);
   if (record.skip) what += element("p", htmlText(textOf(*record.skip)));
   const std::vector<std::string> sentences = failureSentences(record);
@@ -120,11 +137,12 @@ std::string FindingWriter::text(const DiagnosticRecord& record, std::size_t inde
   }
   return "<article class=\"finding " + std::string(nameOf(record.verdict)) + "\" id=\"" + id + "-finding\">" +
          heading(level_, titleOf(record)) + element("p class=\"soft\"", htmlText(record.summary)) +
-         element("div class=\"what\"", what) + adviceOn(record, id + "-finding") + "</article>\n";
+         camerasParagraph(record, streamsOf(run_, index)) + element("div class=\"what\"", what) +
+         adviceOn(record, id + "-finding") + "</article>\n";
 }
 
 std::string findings(const ShownRun& run, std::size_t number, int level, const PageOptions& options) {
-  FindingWriter writer(number, level + 1, options);
+  FindingWriter writer(run, number, level + 1, options);
   std::string html;
   for (std::size_t i = 0; i < run.records.size(); ++i) {
     const DiagnosticRecord& record = run.records[i];
@@ -177,8 +195,7 @@ std::string entryText(const ShownRun& run, std::size_t number, std::size_t index
 }
 
 std::string framesOf(const ShownRun& run, std::size_t number, std::size_t index, int level) {
-  const std::string frames =
-      index < run.streams.size() ? framesSection(run.streams[index], level, true) : std::string();
+  const std::string frames = framesSection(streamsOf(run, index), level, true);
   return scrolling("Frames of " + entryText(run, number, index), frames);
 }
 
@@ -187,6 +204,7 @@ std::string diagnosticSection(const ShownRun& run, std::size_t number, std::size
   const DiagnosticRecord& record = run.records[index];
   const std::string id = idOf(number, index);
   std::string body = wholeName(record.name) + element("p", htmlText(record.summary));
+  body += camerasParagraph(record, streamsOf(run, index));
   body += errorParagraphs(record);
   if (record.skip) body += element("p", htmlText(textOf(*record.skip)));
   const std::string entry = entryText(run, number, index);

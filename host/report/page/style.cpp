@@ -43,7 +43,7 @@ table{border-collapse:collapse;margin:.6rem 0 1.2rem;font-size:.9375rem}
 caption{text-align:left;color:var(--soft);padding:.2rem 0}
 th,td{text-align:left;vertical-align:top;padding:.25rem .6rem .25rem .25rem;border-bottom:1px solid var(--line)}
 thead th{border-bottom:2px solid var(--line);font-weight:600;vertical-align:bottom}
-tbody th{font-weight:500}
+thead .number{white-space:normal}tbody th{font-weight:500;min-width:7rem}
 .line,.whole,h1,h2,h3,h4,p{overflow-wrap:anywhere}
 .number{text-align:right;font-variant-numeric:tabular-nums;white-space:nowrap}
 tr.bad th,tr.bad td{background:var(--failground)}
