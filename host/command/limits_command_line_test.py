@@ -47,7 +47,7 @@ class LimitsTest(CommandLineTest):
 
     def test_a_limit_for_an_unknown_diagnostic_suggests_its_name(self):
         for name, suggestion in (("Nowhere", ""), ("Fake.Oen", "; did you mean 'Fake.One'?"), ("Nowhere.*", ""),
-                                 ("Fake", "; did you mean 'Fake*'?")):
+                                 ("Fake", "; did you mean 'Fake.One'?")):
             with self.subTest(name=name):
                 done = self.run_limited("--limit", f"{name}:A > 0")
                 self.assertEqual(done.returncode, 2, done.stderr)

@@ -40,8 +40,9 @@ class SkipTest(RecordTest):
                       "meant was skipped", done.stdout)
 
     def test_a_limit_of_a_profile_is_not_missed_where_its_diagnostic_is_skipped(self):
-        path = self.profile({"Fake.Two": {"limits": [{"limit": "Count >= 0"}]}})
-        self.verdicts(*HOT, "--allow-skips", "--parameters", path)
+        path = self.directory / "profile.json"
+        path.write_text(json.dumps({"schema": 1, "diagnostics": {"Fake.Two": {"limits": [{"limit": "Count >= 0"}]}}}))
+        self.assertEqual(self.verdicts(*HOT, "--allow-skips", "--parameters", path)[1][0], "skip")
 
     def test_a_limit_that_fits_nothing_is_not_excused_by_a_skip(self):
         self.verdicts(*HOT, "--allow-skips", "--limit", "Nothing >= 0", code=2)

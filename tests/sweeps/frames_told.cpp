@@ -84,8 +84,13 @@ void readSentence(std::string_view sentence, ShownStream& shown) {
 void readPlot(std::string_view plot, ShownStream& shown) {
   const std::vector<double> numbers = numbersIn(between(plot, "<path class=\"curve\" d=\"", "\"").value());
   for (std::size_t i = 0; i < numbers.size(); i += 2) shown.curve.emplace_back(numbers[i], numbers.at(i + 1));
-  for (const char* const label : {R"(y="18">)", R"(y="118">)", R"(x="70" y="134">)", R"(x="710" y="134">)"}) {
-    shown.axes.push_back(numbersIn(between(plot, label, "<").value()).at(0));
+  for (const char* const label : {R"(x="70" y="134">)", R"(x="710" y="134">)"}) {
+    shown.times.push_back(numbersIn(between(plot, label, "<").value()).at(0));
+  }
+  constexpr std::string_view kHeight = R"(class="end" x="64" y=")";
+  while (const auto label = between(plot, kHeight, "</text>")) {
+    shown.heights.push_back(numbersIn(between(*label, ">", " ms").value()).at(0));
+    plot.remove_prefix(plot.find(kHeight) + kHeight.size());
   }
 }
 

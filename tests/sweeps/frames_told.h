@@ -27,9 +27,10 @@ struct ShownStream {
   std::int64_t gapAfter = -1;  // the number of the frame before the first gap
   double gapAt = 0;
   // The plot of the intervals, both empty without one: its points, in the units of the picture, and the numbers at its
-  // axes: the greatest and the least interval, and the times of the first and the last.
+  // axes: the times of the first and the last interval; the greatest interval, and the least if there is room for it.
   std::vector<std::pair<double, double>> curve;
-  std::vector<double> axes;
+  std::vector<double> times;
+  std::vector<double> heights;
 };
 
 // Throws std::out_of_range if the page does not tell of the stream, or not as pages do.

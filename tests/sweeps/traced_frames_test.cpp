@@ -144,12 +144,19 @@ void comparePlot(const ShownStream& shown, std::vector<std::pair<double, double>
   ASSERT_EQ(shown.curve.size(), intervals.size());
   const double begin = intervals.front().first;
   const double end = intervals.back().first;
-  const double axes[] = {greatest, least, begin, end};
-  for (std::size_t i = 0; i < std::size(axes); ++i) expectShown(shown.axes.at(i), axes[i]);
+  ASSERT_EQ(shown.times.size(), 2U);
+  expectShown(shown.times[0], begin);
+  expectShown(shown.times[1], end);
+  // The curve takes five sixths of the height, and differences below 0.1 ms are not stretched to that.
+  const double span = std::max(greatest - least, 0.1) * 1.2;
+  const double bottom = (greatest + least) / 2 - span / 2;
+  const auto heightOf = [span, bottom](double interval) { return 118 - 110 * (interval - bottom) / span; };
+  ASSERT_EQ(shown.heights.size(), heightOf(least) - heightOf(greatest) > 12 ? 2U : 1U);
+  EXPECT_NEAR(shown.heights.front(), greatest, greatest * 5e-4);
+  EXPECT_NEAR(shown.heights.back(), shown.heights.size() == 2 ? least : greatest, greatest * 5e-4);
   for (std::size_t i = 0; i < intervals.size(); ++i) {
     EXPECT_NEAR(shown.curve[i].first, 70 + 640 * (intervals[i].first - begin) / (end - begin), 0.06);
-    const double height = greatest > least ? (intervals[i].second - least) / (greatest - least) : 0.5;
-    EXPECT_NEAR(shown.curve[i].second, 118 - 110 * height, 0.06);
+    EXPECT_NEAR(shown.curve[i].second, heightOf(intervals[i].second), 0.06);
   }
 }
 
