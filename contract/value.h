@@ -94,7 +94,8 @@ class QUAZOR_EXPORT Value {
   template <std::derived_from<Object> O>
   Value(std::shared_ptr<O> object) : data_(std::shared_ptr<Object>(std::move(object))) {}
   Value(DiagnosticErrorPtr error) : data_(std::move(error)) {}
-  // Compiled once, in the library: in every source that holds Values they would take up to a quarter of its compilation.
+  // Compiled once, in the library: in every source that holds Values they would take up to a quarter of its
+  // compilation.
   Value(const Value& other);
   Value(Value&& other) noexcept;
   Value& operator=(const Value& other);

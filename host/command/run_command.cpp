@@ -279,8 +279,8 @@ ResolvedParameters reboundParameters(const DiagnosticRecord& record, const Resol
   return parameters;
 }
 
-// The limits of the record. One that was not missed in the run, for example because its diagnostic ended in an error, is
-// not missed in the analysis.
+// The limits of the record. One that was not missed in the run, for example because its diagnostic ended in an error,
+// is not missed in the analysis.
 std::vector<UserLimit> limitsToAnalyze(const RecordedRun& run) {
   std::vector<UserLimit> limits = run.began.limits;
   for (UserLimit& limit : limits) {

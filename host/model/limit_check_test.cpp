@@ -244,7 +244,7 @@ TEST(LimitWithoutResult, IsFoundAmongAllDiagnostics) {
   skipped.skip = Skip{SkipKind::kNoSuchHardware, "r"};
   EXPECT_TRUE(without("Projector:X > 0", false, {passed, skipped}));
   EXPECT_FALSE(without("Projector:X > 0", true, {passed, skipped}));  // of a profile
-  EXPECT_TRUE(without("X > 0", false, {passed, skipped}));  // the other one ran and has no such result
+  EXPECT_TRUE(without("X > 0", false, {passed, skipped}));            // the other one ran and has no such result
   skipped.skip->kind = SkipKind::kNotReached;
   EXPECT_FALSE(without("X > 0", false, {passed, skipped}));  // something failed before
   // An error that a later attempt replaced excuses nothing.
