@@ -18,10 +18,10 @@ constexpr double kLargestCount = 1e15;
 }  // namespace
 
 std::string shownNumber(double value, const std::vector<double>& thresholds) {
-  const std::string whole = defaultText(value);
+  std::string whole = defaultText(value);
   if (!std::isfinite(value) || (value == std::trunc(value) && std::abs(value) < kLargestCount)) return whole;
   for (int digits = kFewestDigits; digits < kEnoughDigits; ++digits) {
-    const std::string text = significantDigits(value, digits);
+    std::string text = significantDigits(value, digits);
     if (text.size() >= whole.size()) break;
     double rounded = 0;
     std::from_chars(text.data(), text.data() + text.size(), rounded);
