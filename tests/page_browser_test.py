@@ -246,6 +246,7 @@ class PageTest(unittest.TestCase):
         # Most columns have few frames: what is late is there in all detail, and the greatest interval with it.
         interval = (times[5_000 // 3] - times[5_000 // 3 - 1]) / 1e6
         self.assertAlmostEqual(max(y for x, y in whole), interval, places=6)
+        self.assertAlmostEqual(min(y for x, y in whole), (times[5_000 // 3 + 1] - times[5_000 // 3]) / 1e6, places=6)
         self.assertLess(min(abs(x - late) for x, y in whole), 1e-9)
         # In a part, every frame of the record is shown, and the ends of the whole.
         part = zoomed[-1]
