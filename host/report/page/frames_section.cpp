@@ -194,6 +194,7 @@ std::string plotsOf(const RecordedStream& stream, const StreamFacts& facts, cons
   for (const Gap& gap : facts.gaps) marked.push_back(stream.frames[gap.after + 1].captured);
   std::sort(marked.begin(), marked.end());
   std::vector<double> marks;
+  marks.reserve(marked.size());
   for (const std::int64_t time : marked) marks.push_back(secondsOf(time));
   if (isZoomed) html += columnOf("captured", capturesOf(stream)) + columnOf("marks", marked);
   const auto add = [&html, isZoomed](const std::string& caption, const std::string& svg, const std::string& column) {

@@ -11,10 +11,10 @@ namespace quazor {
 namespace {
 
 constexpr unsigned kBitsOfGroup = 7;
-constexpr unsigned kSignShift = 63;
 
 void add(std::string& bytes, std::int64_t number) {
-  std::uint64_t rest = (static_cast<std::uint64_t>(number) << 1U) ^ static_cast<std::uint64_t>(number >> kSignShift);
+  std::uint64_t rest = static_cast<std::uint64_t>(number) << 1U;
+  if (number < 0) rest = ~rest;
   for (; rest >> kBitsOfGroup != 0; rest >>= kBitsOfGroup) bytes += static_cast<char>(rest | 0x80U);
   bytes += static_cast<char>(rest);
 }

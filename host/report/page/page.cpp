@@ -83,6 +83,7 @@ std::string pageOfMany(const std::vector<ShownRun>& runs, const PageOptions& opt
   PageVerdict worst = verdictOf(runs.front());
   std::string sections;
   std::vector<RunStarted> began;
+  began.reserve(runs.size());
   for (const ShownRun& run : runs) began.push_back(run.began);
   for (std::size_t i = 0; i < runs.size(); ++i) {
     const PageVerdict verdict = verdictOf(runs[i]);
