@@ -35,6 +35,32 @@ class NewCommandTest(CommandLineTest):
         self.assertEqual(quazor("new", f"{self.directory}/demo/").returncode, 0)
         self.assertTrue((self.directory / "demo/demo.cpp").is_file())
 
+    def test_the_current_folder_is_filled(self):
+        here = self.directory / "demo"
+        here.mkdir()
+        kept = os.stat(here).st_ino
+        result = quazor("new", ".", cwd=here)
+        self.assertEqual(result.returncode, 0, result.stderr)
+        self.assertEqual(os.stat(here).st_ino, kept, "a shell that is in the folder would stay in one that is gone")
+        self.assertEqual({path.name for path in here.iterdir()},
+                         {"CMakeLists.txt", "README.md", "demo.cpp", "explanations", "phones"})
+        self.assertIn("  CMakeLists.txt\n", result.stdout)
+        self.assertIn("for yourself:\n  cmake -B build", result.stdout)
+        self.assertNotIn("cd ", result.stdout)
+
+    def test_the_folder_to_enter_is_a_word_of_the_shell(self):
+        (self.directory / "two words").mkdir()
+        result = quazor("new", "two words/demo", cwd=self.directory)
+        self.assertIn("\n  cd 'two words/demo'\n", result.stdout)
+
+    def test_the_current_folder_is_refused_if_it_has_files(self):
+        here = self.directory / "demo"
+        here.mkdir()
+        self.write("demo/notes.txt", "mine")
+        result = quazor("new", ".", cwd=here)
+        self.assert_refused(result, 73, "'.' cannot be made: the folder is not empty")
+        self.assertEqual([path.name for path in here.iterdir()], ["notes.txt"])
+
     def test_what_is_there_is_not_touched(self):
         (self.directory / "full").mkdir()
         self.write("full/notes.txt", "mine")
