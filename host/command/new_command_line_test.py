@@ -95,6 +95,14 @@ class NewCommandTest(CommandLineTest):
         self.assert_refused(quazor("new", self.directory / "tessel_fault"), 64, "'TesselFaultDiagnostic'")
         self.assertEqual(self.content(), before)
 
+    def test_what_is_not_yet_installed_is_told_how_to_be_found(self):
+        by_file = "and one that is not installed is given by its file"
+        self.assert_refused(quazor("selftest", "demo/*"), 64, "no installed phone is called 'demo/*'", by_file)
+        self.assert_refused(quazor("run", "--all", "--phone", "demo/many_events"), 66, by_file)
+        self.assert_refused(quazor("run", "DemoDiagnostic"), 64, "'--plugin FILE' loads a plug-in that is not installed")
+        for topic in ("Demo.Total", "DemoErrorDomain:2"):
+            self.assert_refused(quazor("explain", topic), 64, "no explanation of ", "'cmake --install build' in its project")
+
     def test_selftest_judges_the_phones_of_a_project(self):
         self.assertEqual(quazor("new", self.directory / "event_count").returncode, 0)
         phones = sorted((self.directory / "event_count/phones").glob("*.json"))
