@@ -202,6 +202,10 @@ std::optional<std::int64_t> integerOf(std::string_view text) {
   return problem == std::errc() && end == text.data() + text.size() ? std::optional(number) : std::nullopt;
 }
 
+// Explanations are read where they are installed, not in a project.
+constexpr std::string_view kOwnPlugin =
+    "if it is of your own plug-in, install that first: 'cmake --install build' in its project";
+
 struct ErrorKey {
   std::string domain;
   std::int64_t code;
@@ -255,8 +259,10 @@ std::string nearestDomain(const std::vector<Explanation>& explanations, const st
   throw CommandError(
       ExitCode::kUsage,
       formatMessage("no explanation of the error domain '%@'; %@", key.domain,
-                    nearest.empty() ? "if the report shows it after 'caused by', look up the error on the line above"
-                                    : "did you mean '" + nearest + "'?"));
+                    nearest.empty()
+                        ? "if the report shows it after 'caused by', look up the error on the line above; " +
+                              std::string(kOwnPlugin)
+                        : "did you mean '" + nearest + "'?"));
 }
 
 // True if the text has the word between others.
@@ -294,9 +300,10 @@ const Explanation* findMention(const std::vector<Explanation>& explanations, con
   if (nearest.empty()) nearest = didYouMeanOrPattern(asked, names);  // such as the camera of a result
   const Explanation* const mention = nearest.empty() ? findMention(explanations, asked) : nullptr;
   if (mention != nullptr) nearest = "; that of '" + keysOf(*mention).front() + "' mentions it";
-  throw CommandError(ExitCode::kUsage,
-                     formatMessage("no explanation of '%@'%@", asked,
-                                   nearest.empty() ? "; 'quazor explain' lists all explanations" : nearest));
+  throw CommandError(ExitCode::kUsage, formatMessage("no explanation of '%@'%@", asked,
+                                                     nearest.empty() ? "; 'quazor explain' lists all explanations; " +
+                                                                           std::string(kOwnPlugin)
+                                                                     : nearest));
 }
 
 }  // namespace

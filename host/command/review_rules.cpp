@@ -1,6 +1,7 @@
 #include "host/command/review_rules.h"
 
 #include "base/text/control_characters.h"
+#include "base/text/letter_case.h"
 #include "contract/message_format.h"
 #include "host/text/display_width.h"
 #include "host/text/table.h"
@@ -129,13 +130,10 @@ ReviewFindings reviewName(std::string_view kind, const std::string& name) {
                                       name, kind)});
   }
   if (name.find(kind) == std::string::npos) {
-    findings.push_back(
-        {Rating::kAdvice, subject,
-         formatMessage("'%@' does not say that it is a%@ %@; users see such names side by side, so "
-                       "put the word %@ into it",
-                       name, kind.starts_with('D') ? "" : "n",
-                       std::string(1, static_cast<char>(kind.front() - 'A' + 'a')) + std::string(kind.substr(1)),
-                       kind)});
+    findings.push_back({Rating::kAdvice, subject,
+                        formatMessage("'%@' does not say that it is a%@ %@; users see such names side by side, so "
+                                      "put the word %@ into it",
+                                      name, kind.starts_with('D') ? "" : "n", withSmallLetters(kind), kind)});
   }
   if (widthOf(name) > kMaxName) {
     findings.push_back({Rating::kAdvice, subject,
