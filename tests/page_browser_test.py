@@ -15,15 +15,14 @@ import os
 import pathlib
 import random
 import re
-import shutil
 import subprocess
 import sys
 import tempfile
 import unittest
 
+import browser
 import page_reader
 
-BROWSER = shutil.which("chromium-headless-shell")
 LIBRARY = pathlib.Path("/usr/share/javascript/dygraphs/dygraph.min.js")
 PROGRAM = sys.argv.pop(1) if len(sys.argv) > 1 else ""
 THOROUGH = os.environ.get("QUAZOR_THOROUGH") == "1"
@@ -83,11 +82,7 @@ class PageTest(unittest.TestCase):
         quazor("report", self.record, "--output", self.page)
 
     def browse(self, *switches):
-        result = subprocess.run([BROWSER, "--no-sandbox", "--disable-gpu", "--enable-logging=stderr", "--timeout=20000",
-                                 f"--user-data-dir={self.directory / 'browser'}", *switches, self.page.as_uri()],
-                                capture_output=True, text=True, timeout=120)
-        self.assertEqual(result.returncode, 0, result.stderr)
-        return result
+        return browser.browse(self.page, self.directory, *switches)
 
     def open(self):
         """The document after the page was loaded, and what the browser says on its console."""
@@ -104,7 +99,7 @@ class PageTest(unittest.TestCase):
         self.make("--phone", "camera_sync/frames_dropped", "--profile", "strict")
         document, complaints = self.open()
         self.assertEqual(complaints, [])
-        self.assertNotEqual(self.picture(), self.picture("--blink-settings=preferredColorScheme=0"))  # light and dark
+        self.assertNotEqual(self.picture(), self.picture(browser.DARK))  # light and dark
         shown, written = (page_reader.Page(text.encode()) for text in (document, self.page.read_text()))
         self.assertEqual((shown.verdict, shown.facts), ("FAIL", written.facts))
         self.assertEqual(shown.records, written.records)
@@ -276,7 +271,7 @@ class PageTest(unittest.TestCase):
 
 
 if __name__ == "__main__":
-    if BROWSER is None:
+    if browser.BROWSER is None:
         print("skipped: chromium-headless-shell is not installed, so no page was opened in a browser")
         sys.exit(77)
     if not LIBRARY.is_file():
