@@ -3,6 +3,7 @@
 #include "base/json/json_cursor.h"
 #include "base/text/control_characters.h"
 #include "base/text/input_error.h"
+#include "base/text/name_list.h"
 #include "base/text/nearest_name.h"
 #include "contract/message_format.h"
 #include "host/error/exit_code.h"
@@ -247,13 +248,13 @@ std::string nearestDomain(const std::vector<Explanation>& explanations, const st
 }
 
 [[noreturn]] void refuseKey(const std::vector<Explanation>& explanations, const ErrorKey& key) {
-  std::string codes;
+  std::vector<std::string> codes;
   for (const Explanation& one : explanations) {
-    if (one.isError() && one.domain == key.domain) codes += (codes.empty() ? "" : ", ") + std::to_string(one.code);
+    if (one.isError() && one.domain == key.domain) codes.push_back(std::to_string(one.code));
   }
   if (!codes.empty()) {
     throw CommandError(ExitCode::kUsage, formatMessage("no explanation of code %@ in '%@'; the explained codes are %@",
-                                                       key.code, key.domain, codes));
+                                                       key.code, key.domain, listText(codes)));
   }
   const std::string nearest = nearestDomain(explanations, key.domain);
   throw CommandError(
