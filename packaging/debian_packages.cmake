@@ -29,7 +29,7 @@ file(CONFIGURE OUTPUT triggers CONTENT "activate-noawait ldconfig\n")
 
 set(CPACK_DEBIAN_PROGRAM_PACKAGE_NAME quazor)
 set(CPACK_DEBIAN_PROGRAM_PACKAGE_SECTION utils)
-set(CPACK_DEBIAN_PROGRAM_PACKAGE_RECOMMENDS quazor-plugins)
+set(CPACK_DEBIAN_PROGRAM_PACKAGE_RECOMMENDS "quazor-plugins, libjs-dygraphs")
 set(CPACK_DEBIAN_PROGRAM_PACKAGE_CONTROL_EXTRA
     ${CMAKE_CURRENT_BINARY_DIR}/shlibs ${CMAKE_CURRENT_BINARY_DIR}/triggers)
 set(CPACK_DEBIAN_PROGRAM_DESCRIPTION "hardware diagnostics for a phone's cameras and sensors

@@ -1,38 +1,69 @@
 #!/usr/bin/env python3
-"""Opens report pages in a browser. Pages have no script.
+"""Opens report pages in a browser. Only a page of many frames has scripts: those that zoom.
 
 usage: page_browser_test.py QUAZOR
 
-Exit code 77: skipped, because the browser (Debian's chromium-headless-shell) is not installed.
+Exit code 77: skipped, because the browser (Debian's chromium-headless-shell) or the library of plots (libjs-dygraphs)
+is not installed.
 """
 
+import base64
+import hashlib
 import html
 import json
 import os
 import pathlib
+import random
 import re
-import shutil
 import subprocess
 import sys
 import tempfile
 import unittest
 
+import browser
 import page_reader
 
-BROWSER = shutil.which("chromium-headless-shell")
+LIBRARY = pathlib.Path("/usr/share/javascript/dygraphs/dygraph.min.js")
 PROGRAM = sys.argv.pop(1) if len(sys.argv) > 1 else ""
 THOROUGH = os.environ.get("QUAZOR_THOROUGH") == "1"
 MAX_PAGE_OF_ALL = 150_000
 MAX_PAGE_OF_MANY_FRAMES = 8_000_000
 FRAMES = 1_000_000 if THOROUGH else 100_000
+MAX_READY = 3_000  # milliseconds, as all below
+MAX_ZOOM = 50
+PERIOD = 33_333_333  # nanoseconds, as the next
+JITTER = 1_000_000
+LATE = 20_000_000
+# Zooms into the plot by its buttons.
+PROBE = """
+const ready = performance.now();
+const plot = document.querySelector('.live').plot;
+const rows = () => Array.from({length: plot.numRows()}, (_, row) => [plot.getValue(row, 0), plot.getValue(row, 1)]);
+const press = name => {
+  const before = performance.now();
+  [...document.querySelectorAll('.buttons button')].find(one => one.textContent === name).click();
+  return performance.now() - before;
+};
+const zooms = [], shown = [rows()];
+for (let i = 0; i < 4; ++i) {
+  zooms.push(press('Zoom in'));
+  shown.push(rows());
+}
+zooms.push(press('Earlier'), press('Later'));
+for (let i = 0; i < 4; ++i) zooms.push(press('Zoom out'));
+press('Zoom in');
+zooms.push(press('All'));
+return {ready, zooms, shown, whole: rows()};
+"""
 # Each would leave a mark in the document.
 ATTACKS = ("</style></title></script><script>document.documentElement.id='attacked'</script>",
            "<img src=x onerror=\"document.documentElement.id='attacked'\">", "\" autofocus onfocus=\"location='#attacked'",
            "\u202eevil\u2066", "x" * 100_000)
 
 
-def quazor(*arguments, codes=(0,)):
-    result = subprocess.run([PROGRAM, *map(str, arguments)], capture_output=True, text=True, timeout=300)
+def quazor(*arguments, codes=(0,), environment=None):
+    result = subprocess.run([PROGRAM, *map(str, arguments)], capture_output=True, text=True, timeout=300,
+                            env=os.environ | (environment or {}))
     if result.returncode not in codes:
         raise AssertionError(f"{arguments}: {result.returncode}: {result.stderr}")
 
@@ -51,11 +82,7 @@ class PageTest(unittest.TestCase):
         quazor("report", self.record, "--output", self.page)
 
     def browse(self, *switches):
-        result = subprocess.run([BROWSER, "--no-sandbox", "--disable-gpu", "--enable-logging=stderr", "--timeout=20000",
-                                 f"--user-data-dir={self.directory / 'browser'}", *switches, self.page.as_uri()],
-                                capture_output=True, text=True, timeout=120)
-        self.assertEqual(result.returncode, 0, result.stderr)
-        return result
+        return browser.browse(self.page, self.directory, *switches)
 
     def open(self):
         """The document after the page was loaded, and what the browser says on its console."""
@@ -72,7 +99,7 @@ class PageTest(unittest.TestCase):
         self.make("--phone", "camera_sync/frames_dropped", "--profile", "strict")
         document, complaints = self.open()
         self.assertEqual(complaints, [])
-        self.assertNotEqual(self.picture(), self.picture("--blink-settings=preferredColorScheme=0"))  # light and dark
+        self.assertNotEqual(self.picture(), self.picture(browser.DARK))  # light and dark
         shown, written = (page_reader.Page(text.encode()) for text in (document, self.page.read_text()))
         self.assertEqual((shown.verdict, shown.facts), ("FAIL", written.facts))
         self.assertEqual(shown.records, written.records)
@@ -154,34 +181,100 @@ class PageTest(unittest.TestCase):
         self.page.write_text(re.sub("<meta http-equiv[^>]*>", "", text).replace("<main>", "<main>" + ATTACKS[1]))
         self.assertIn('id="attacked"', self.open()[0])
 
-    def test_many_frames(self):
-        """A forged record of one stream with a gap."""
-        self.make()
+    def make_with_many_frames(self, frames, environment=None):
+        """The page of a forged record of one stream with jitter and a gap. Returns the times of capture."""
+        quazor("run", "SingleCameraDiagnostic", "--record", self.record)
         lines = self.record.read_text().splitlines()
-        index = max(place for place, line in enumerate(lines) if '"event":"frames"' in line)
+        index = next(place for place, line in enumerate(lines) if '"event":"frames"' in line)
+        lines = [line for place, line in enumerate(lines) if place <= index or '"event":"frames"' not in line]
         event = json.loads(lines[index])
-        period = 33_333_333
+        draw = random.Random(1)
+        times = [(number + 1) * PERIOD + draw.randrange(JITTER) for number in range(frames)]
+        times[frames // 3] += LATE
         events = []
-        for first in range(0, FRAMES, 4096):
-            rows = min(4096, FRAMES - first)
-            columns = {name: [(first + 1) * period] + [period] * (rows - 1)
-                       for name in ("captured", "delivered", "returned")}
-            columns["number"] = [first + (2 if first > FRAMES // 2 else 0)] + [1] * (rows - 1)
-            events.append(json.dumps(event | {"columns": columns}))
+        for first in range(0, frames, 4096):
+            part = times[first:first + 4096]
+            column = [part[0]] + [after - before for before, after in zip(part, part[1:])]
+            number = [first + (2 if first > frames // 2 else 0)] + [1] * (len(part) - 1)
+            events.append(json.dumps(event | {"columns": {"number": number, "captured": column, "delivered": column,
+                                                          "returned": column}}))
         lines[index:index + 1] = events
         with self.record.open("w") as record:
             for place, line in enumerate(lines):
                 record.write(json.dumps(json.loads(line) | {"sequence": place}) + "\n")
-        quazor("report", self.record, "--output", self.page)
+        quazor("report", self.record, "--output", self.page, environment=environment)
+        return times
+
+    def scripted(self, script):
+        """What the script, run after those of the page and allowed by its policy, leaves as the title; and the
+        complaints of the console."""
+        script = f"document.title = JSON.stringify((() => {{{script}}})());"
+        digest = base64.b64encode(hashlib.sha256(script.encode()).digest()).decode()
+        text = self.page.read_text()
+        self.assertIn("; script-src ", text)
+        text = text.replace("; script-src ", f"; script-src 'sha256-{digest}' ", 1)
+        self.page.write_text(text.replace("</body>", f"<script>{script}</script></body>"))
+        result = self.browse("--dump-dom")
+        title = re.search("<title>(.*?)</title>", result.stdout, re.DOTALL).group(1)
+        return json.loads(html.unescape(title)), [one for one in result.stderr.splitlines() if "CONSOLE" in one]
+
+    def test_many_frames(self):
+        times = self.make_with_many_frames(FRAMES)
         self.assertLess(len(self.page.read_bytes()), MAX_PAGE_OF_MANY_FRAMES)
         document, complaints = self.open()
         self.assertEqual(complaints, [])
-        self.assertIn(f"{FRAMES} frames, captured from 0.0333333 s", document)
+        self.assertIn(f"{FRAMES} frames, captured from {times[0] / 1e9:.6g} s", document)
         self.assertIn("2 frame numbers are missing, at 1 place", document)
+        facts, complaints = self.scripted(PROBE)
+        self.assertEqual(complaints, [])
+        print(f"{FRAMES} frames: {len(self.page.read_bytes())} bytes, ready after {facts['ready']:.0f} ms, "
+              f"zooms {[round(one) for one in facts['zooms']]} ms")
+        self.assertLess(facts["ready"], MAX_READY)
+        self.assertLess(sorted(facts["zooms"])[len(facts["zooms"]) // 2], MAX_ZOOM)
+
+    def test_a_zoomed_plot_shows_the_frames_of_the_record(self):
+        times = self.make_with_many_frames(5_000)
+        facts, complaints = self.scripted(PROBE)
+        self.assertEqual(complaints, [])
+        whole, *zoomed = facts["shown"]
+        late = times[5_000 // 3] / 1e9
+        # Most columns have few frames: what is late is there in all detail, and the greatest interval with it.
+        interval = (times[5_000 // 3] - times[5_000 // 3 - 1]) / 1e6
+        self.assertAlmostEqual(max(y for x, y in whole), interval, places=6)
+        self.assertAlmostEqual(min(y for x, y in whole), (times[5_000 // 3 + 1] - times[5_000 // 3]) / 1e6, places=6)
+        self.assertLess(min(abs(x - late) for x, y in whole), 1e-9)
+        # In a part, every frame of the record is shown, and the ends of the whole.
+        part = zoomed[-1]
+        true = {round(after / 1e9, 9): (after - before) / 1e6 for before, after in zip(times, times[1:])}
+        self.assertGreater(len(part), 100)
+        for x, y in part:
+            self.assertAlmostEqual(y, true[round(x, 9)], places=6)
+        inner = [x for x, y in part[1:-1]]
+        self.assertEqual(len(inner), sum(inner[0] <= x <= inner[-1] for x in true))
+        self.assertEqual((part[0][0], part[-1][0]), (times[1] / 1e9, times[-1] / 1e9))
+        self.assertEqual(facts["whole"], facts["shown"][0])  # after "All"
+
+    def test_without_the_library_a_page_has_pictures_and_says_so(self):
+        self.make_with_many_frames(1_000, environment={"XDG_DATA_DIRS": "/nonexistent"})
+        text = self.page.read_text()
+        self.assertNotIn("<script", text)
+        self.assertIn("libjs-dygraphs", text)
+        self.assertEqual(self.open()[1], [])
+
+    def test_a_page_of_many_frames_runs_only_its_own_scripts(self):
+        self.make_with_many_frames(1_000)
+        self.page.write_text(self.page.read_text().replace("<main>", "<main>" + "".join(ATTACKS[:2])))
+        document, complaints = self.open()
+        self.assertNotIn('id="attacked"', document)
+        self.assertEqual(sum("Content Security Policy" in one for one in complaints), 3, complaints)
+        self.assertIn("<canvas", document)
 
 
 if __name__ == "__main__":
-    if BROWSER is None:
+    if browser.BROWSER is None:
         print("skipped: chromium-headless-shell is not installed, so no page was opened in a browser")
+        sys.exit(77)
+    if not LIBRARY.is_file():
+        print("skipped: libjs-dygraphs is not installed, so no page was opened in a browser")
         sys.exit(77)
     unittest.main()

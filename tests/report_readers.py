@@ -263,7 +263,7 @@ def read_junit(suite):
     cases = suite.findall("testcase")
     errors = [one for one in cases if one.find("error") is not None and "value" not in properties_of(one)]
     measured = next((properties_of(one) for one in cases if one.get("name") == "result"), {})
-    values = {key[len("measurement."):]: value.split(" ", 1)
+    values = {key[len("measurement."):]: value.partition(" ")[::2]
               for key, value in measured.items() if key.startswith("measurement.")}
     record = {
         "name": suite.get("name"),

@@ -1,6 +1,7 @@
 #include "base/text/nearest_name.h"
 
 #include "base/text/letter_case.h"
+#include "base/text/name_list.h"
 
 #include <algorithm>
 #include <iterator>
@@ -46,12 +47,10 @@ std::string didYouMean(std::string_view name, const std::vector<std::string>& ca
 }
 
 std::string didYouMeanOf(std::string_view name, std::string_view what, const std::vector<std::string>& candidates) {
-  std::string list;
-  for (const std::string& one : candidates) list += (list.empty() ? "" : ", ") + one;
   std::string suggestion = didYouMean(name, candidates);
   const std::string all = suggestion.empty() ? std::string(what) : capitalized(what);
   suggestion += suggestion.empty() ? "; " : " ";
-  return suggestion + all + " are " + (list.empty() ? "none" : list);
+  return suggestion + all + " are " + (candidates.empty() ? "none" : listText(candidates));
 }
 
 std::string didYouMeanOrPattern(std::string_view name, const std::vector<std::string>& candidates) {

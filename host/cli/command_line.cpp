@@ -1,5 +1,6 @@
 #include "host/cli/command_line.h"
 
+#include "base/text/name_list.h"
 #include "contract/contract.h"
 #include "host/cli/help_texts.h"
 #include "host/cli/option_checks.h"
@@ -112,9 +113,7 @@ void addOutput(CLI::App& command, RawOptions& raw) {
 }
 
 void addReportOptions(CLI::App& command, RawOptions& raw, const std::vector<std::string>& formats) {
-  std::string list;
-  for (const std::string& format : formats) list += (list.empty() ? "" : ", ") + format;
-  command.add_option("--format", raw.format, "Report format: " + list)
+  command.add_option("--format", raw.format, "Report format: " + listText(formats))
       ->type_name("FORMAT")
       ->check(CLI::IsMember(formats));
   if (formats.size() <= 2) return addOutput(command, raw);

@@ -1,5 +1,6 @@
 #include "host/command/detection.h"
 
+#include "base/text/name_list.h"
 #include "contract/message_format.h"
 #include "host/model/limit_check.h"
 #include "host/report/text_report.h"
@@ -15,10 +16,6 @@ using Json = nlohmann::ordered_json;
 namespace {
 
 constexpr std::size_t kMaxReasons = 3;  // of one run
-
-std::string valueText(const Measurement& measurement) {
-  return formatMessage("%@ %@", measurement.value(), measurement.unit().symbol());
-}
 
 const JudgedResult* resultNamed(const DiagnosticRecord& record, const std::string& name) {
   const auto found = std::find_if(record.measuredResults.begin(), record.measuredResults.end(),
@@ -253,10 +250,7 @@ std::string alarmText(const DiagnosticRecord& record) {
     if (check.verdict() != ResultVerdict::kPass)
       failed.push_back(check.result.name() + " by the limit " + labelOf(check.limit));
   }
-  std::string text = record.name + " fails: ";
-  for (std::size_t i = 0; i < failed.size() && i < kMaxReasons; ++i) text += (i == 0 ? "" : ", ") + failed[i];
-  if (failed.size() > kMaxReasons) text += formatMessage(" and %@ more", failed.size() - kMaxReasons);
-  return text;
+  return record.name + " fails: " + listText(failed, kMaxReasons);
 }
 
 void printDetections(std::ostream& out, const std::vector<PhoneDetection>& phones) {

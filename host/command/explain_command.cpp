@@ -1,5 +1,6 @@
 #include "host/command/explain_command.h"
 
+#include "base/text/name_list.h"
 #include "contract/message_format.h"
 #include "host/command/explanations.h"
 #include "host/plugin/parameter_range.h"
@@ -22,12 +23,6 @@ using Explanations = std::vector<const Explanation*>;
 
 constexpr int kDocumentSchema = 1;
 
-std::string joined(const std::vector<std::string>& texts) {
-  std::string all;
-  for (const std::string& text : texts) all += (all.empty() ? "" : ", ") + text;
-  return all;
-}
-
 void printNames(std::ostream& out, const Explanation& one) {
   for (const std::string& name : one.names) printWrapped(out, name, "", "");
 }
@@ -35,7 +30,7 @@ void printNames(std::ostream& out, const Explanation& one) {
 void printHeading(std::ostream& out, const Explanation& one) {
   printNames(out, one);
   if (!one.isError()) return;
-  const std::string symbols = one.symbols.empty() ? "" : " (" + joined(one.symbols) + ")";
+  const std::string symbols = one.symbols.empty() ? "" : " (" + listText(one.symbols) + ")";
   printWrapped(out, formatMessage("%@ code %@%@", one.domain, one.code, symbols), "", "");
 }
 
@@ -44,7 +39,7 @@ void printMessages(std::ostream& out, const Explanation& one) {
   out << "\n  Messages\n";
   for (const ExplainedMessage& message : one.messages) {
     printWrapped(out, "\"" + message.text + "\"", "    ", "    ");
-    printWrapped(out, "from " + joined(message.from), "      ", "      ");
+    printWrapped(out, "from " + listText(message.from), "      ", "      ");
     if (!message.meaning.empty()) printWrapped(out, message.meaning, "      ", "      ");
   }
 }
@@ -86,7 +81,7 @@ void printExplanation(std::ostream& out, const Explanation& one, const std::vect
   printWrapped(out, one.meaning, "  ", "  ");
   if (!one.from.empty()) {
     out << "\n  Result of\n";
-    printWrapped(out, joined(one.from), "    ", "    ");
+    printWrapped(out, listText(one.from), "    ", "    ");
   }
   printMessages(out, one);
   printParameters(out, one);

@@ -3,6 +3,7 @@
 #include "base/json/json_cursor.h"
 #include "base/text/control_characters.h"
 #include "base/text/input_error.h"
+#include "base/text/name_list.h"
 #include "base/text/nearest_name.h"
 #include "contract/message_format.h"
 #include "host/error/exit_code.h"
@@ -202,6 +203,10 @@ std::optional<std::int64_t> integerOf(std::string_view text) {
   return problem == std::errc() && end == text.data() + text.size() ? std::optional(number) : std::nullopt;
 }
 
+// Explanations are read where they are installed, not in a project.
+constexpr std::string_view kOwnPlugin =
+    "if it is of your own plug-in, install that first: 'cmake --install build' in its project";
+
 struct ErrorKey {
   std::string domain;
   std::int64_t code;
@@ -243,20 +248,22 @@ std::string nearestDomain(const std::vector<Explanation>& explanations, const st
 }
 
 [[noreturn]] void refuseKey(const std::vector<Explanation>& explanations, const ErrorKey& key) {
-  std::string codes;
+  std::vector<std::string> codes;
   for (const Explanation& one : explanations) {
-    if (one.isError() && one.domain == key.domain) codes += (codes.empty() ? "" : ", ") + std::to_string(one.code);
+    if (one.isError() && one.domain == key.domain) codes.push_back(std::to_string(one.code));
   }
   if (!codes.empty()) {
     throw CommandError(ExitCode::kUsage, formatMessage("no explanation of code %@ in '%@'; the explained codes are %@",
-                                                       key.code, key.domain, codes));
+                                                       key.code, key.domain, listText(codes)));
   }
   const std::string nearest = nearestDomain(explanations, key.domain);
   throw CommandError(
       ExitCode::kUsage,
       formatMessage("no explanation of the error domain '%@'; %@", key.domain,
-                    nearest.empty() ? "if the report shows it after 'caused by', look up the error on the line above"
-                                    : "did you mean '" + nearest + "'?"));
+                    nearest.empty()
+                        ? "if the report shows it after 'caused by', look up the error on the line above; " +
+                              std::string(kOwnPlugin)
+                        : "did you mean '" + nearest + "'?"));
 }
 
 // True if the text has the word between others.
@@ -294,9 +301,10 @@ const Explanation* findMention(const std::vector<Explanation>& explanations, con
   if (nearest.empty()) nearest = didYouMeanOrPattern(asked, names);  // such as the camera of a result
   const Explanation* const mention = nearest.empty() ? findMention(explanations, asked) : nullptr;
   if (mention != nullptr) nearest = "; that of '" + keysOf(*mention).front() + "' mentions it";
-  throw CommandError(ExitCode::kUsage,
-                     formatMessage("no explanation of '%@'%@", asked,
-                                   nearest.empty() ? "; 'quazor explain' lists all explanations" : nearest));
+  throw CommandError(ExitCode::kUsage, formatMessage("no explanation of '%@'%@", asked,
+                                                     nearest.empty() ? "; 'quazor explain' lists all explanations; " +
+                                                                           std::string(kOwnPlugin)
+                                                                     : nearest));
 }
 
 }  // namespace

@@ -1,15 +1,17 @@
 #include "host/command/commands.h"
 
 #include "base/text/input_error.h"
+#include "base/text/letter_case.h"
+#include "contract/message_format.h"
 #include "host/command/selection.h"
 #include "host/error/exit_code.h"
 #include "host/system/output_file.h"
+#include "host/text/shell_word.h"
 
 #include <sys/stat.h>
 
 #include <algorithm>
 #include <array>
-#include <cctype>
 #include <cerrno>
 #include <cstdlib>
 #include <cstring>
@@ -63,7 +65,8 @@ std::string classNameOf(const std::string& name) {
   std::string words;
   bool begins = true;
   for (const char unit : name) {
-    if (unit != '_') words += begins ? static_cast<char>(std::toupper(static_cast<unsigned char>(unit))) : unit;
+    const std::string letter(1, unit);
+    if (unit != '_') words += begins ? capitalized(letter) : letter;
     begins = unit == '_';
   }
   return words;
@@ -101,8 +104,9 @@ void checkIsNew(const std::string& name, const Options& options, const Installat
                                       std::pair(one.analysisName, "Analysis")}) {
       if (taken != words + kind) continue;
       const std::string plugin = one.plugins.empty() ? std::string() : one.plugins.front().string();
-      refuseName(name, "it would register '" + taken + "', as '" + plugin +
-                           "' does, and the two could not be loaded together; choose another one");
+      refuseName(name, formatMessage("it would register '%@', as '%@' does, and the two could not be loaded together; "
+                                     "choose another one",
+                                     taken, plugin));
     }
   }
 }
@@ -132,14 +136,16 @@ std::vector<TemplateFile> projectFiles(const fs::path& folder, const std::string
   throw CommandError(ExitCode::kCannotWrite, "the project '" + folder.string() + "' cannot be made: " + why);
 }
 
-// Removes a folder unless it was kept.
+// A folder in which the project is made, so that `target` gets all of it or nothing.
 // Thread: one at a time.
 class NewFolder {
  public:
-  // A folder of a name that is not yet used, beside `target`.
-  explicit NewFolder(const fs::path& target) {
-    std::string name = (target.parent_path() / ("." + target.filename().string() + "-XXXXXX")).string();
-    if (::mkdtemp(name.data()) == nullptr) refuseFolder(target, std::strerror(errno));
+  // It is beside `target`, or in it if that is a folder: the current one cannot be replaced, and the one above it may
+  // be another user's.
+  explicit NewFolder(fs::path target) : target_(std::move(target)), isThere_(fs::exists(target_)) {
+    const fs::path parent = isThere_ ? target_ : target_.parent_path();
+    std::string name = (parent / ("." + target_.filename().string() + "-XXXXXX")).string();
+    if (::mkdtemp(name.data()) == nullptr) refuseFolder(target_, std::strerror(errno));
     path_ = name;
     ::chmod(path_.c_str(), 0755);
   }
@@ -156,16 +162,28 @@ class NewFolder {
     writeOutputFile(path_ / file.name, file.text);
   }
 
-  // Gives the folder its name at once. An empty folder of that name is replaced.
-  void keep(const fs::path& target) {
-    std::error_code error;
-    fs::rename(path_, target, error);
-    if (error) refuseFolder(target, error.message());
-    path_.clear();
+  // Gives the folder its name, or moves what it holds into the folder of that name.
+  void keep() {
+    if (!isThere_) {
+      move(path_, target_);
+      path_.clear();
+      return;
+    }
+    for (const fs::directory_entry& one : fs::directory_iterator(path_)) {
+      move(one.path(), target_ / one.path().filename());
+    }
   }
 
  private:
-  fs::path path_;
+  void move(const fs::path& from, const fs::path& to) const {
+    std::error_code error;
+    fs::rename(from, to, error);
+    if (error) refuseFolder(target_, error.message());
+  }
+
+  fs::path target_;
+  bool isThere_;
+  fs::path path_;  // empty once it has the name of the target
 };
 
 }  // namespace
@@ -184,13 +202,15 @@ ExitCode newCommand(const Options& options, const Installation& installation, Co
   const std::vector<TemplateFile> files = projectFiles(installation.pluginTemplate(), name);
   NewFolder made(folder);
   for (const TemplateFile& file : files) made.write(file);
-  made.keep(folder);
+  made.keep();
   std::string list;
   for (const TemplateFile& file : files)
     list += "  " + (fs::path(given) / file.name).lexically_normal().string() + "\n";
+  const std::string enter = folder == fs::current_path(error) ? "" : "  cd " + shellWord(given) + "\n";
   console.out << "Made the plug-in " << name << " with the diagnostic " << classNameOf(name) << "Diagnostic:\n"
-              << list << "\nBuild and test it, and install it for yourself:\n  cd " << given
-              << "\n  cmake -B build && cmake --build build && ctest --test-dir build\n  cmake --install build\n";
+              << list << "\nBuild and test it, and install it for yourself:\n"
+              << enter
+              << "  cmake -B build && cmake --build build && ctest --test-dir build\n  cmake --install build\n";
   return ExitCode::kAllPassed;
 }
 

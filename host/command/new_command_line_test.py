@@ -35,6 +35,32 @@ class NewCommandTest(CommandLineTest):
         self.assertEqual(quazor("new", f"{self.directory}/demo/").returncode, 0)
         self.assertTrue((self.directory / "demo/demo.cpp").is_file())
 
+    def test_the_current_folder_is_filled(self):
+        here = self.directory / "demo"
+        here.mkdir()
+        kept = os.stat(here).st_ino
+        result = quazor("new", ".", cwd=here)
+        self.assertEqual(result.returncode, 0, result.stderr)
+        self.assertEqual(os.stat(here).st_ino, kept, "a shell that is in the folder would stay in one that is gone")
+        self.assertEqual({path.name for path in here.iterdir()},
+                         {"CMakeLists.txt", "README.md", "demo.cpp", "explanations", "phones"})
+        self.assertIn("  CMakeLists.txt\n", result.stdout)
+        self.assertIn("for yourself:\n  cmake -B build", result.stdout)
+        self.assertNotIn("cd ", result.stdout)
+
+    def test_the_folder_to_enter_is_a_word_of_the_shell(self):
+        (self.directory / "two words").mkdir()
+        result = quazor("new", "two words/demo", cwd=self.directory)
+        self.assertIn("\n  cd 'two words/demo'\n", result.stdout)
+
+    def test_the_current_folder_is_refused_if_it_has_files(self):
+        here = self.directory / "demo"
+        here.mkdir()
+        self.write("demo/notes.txt", "mine")
+        result = quazor("new", ".", cwd=here)
+        self.assert_refused(result, 73, "'.' cannot be made: the folder is not empty")
+        self.assertEqual([path.name for path in here.iterdir()], ["notes.txt"])
+
     def test_what_is_there_is_not_touched(self):
         (self.directory / "full").mkdir()
         self.write("full/notes.txt", "mine")
@@ -68,6 +94,14 @@ class NewCommandTest(CommandLineTest):
                             "choose another one")
         self.assert_refused(quazor("new", self.directory / "tessel_fault"), 64, "'TesselFaultDiagnostic'")
         self.assertEqual(self.content(), before)
+
+    def test_what_is_not_yet_installed_is_told_how_to_be_found(self):
+        by_file = "and one that is not installed is given by its file"
+        self.assert_refused(quazor("selftest", "demo/*"), 64, "no installed phone is called 'demo/*'", by_file)
+        self.assert_refused(quazor("run", "--all", "--phone", "demo/many_events"), 66, by_file)
+        self.assert_refused(quazor("run", "DemoDiagnostic"), 64, "'--plugin FILE' loads a plug-in that is not installed")
+        for topic in ("Demo.Total", "DemoErrorDomain:2"):
+            self.assert_refused(quazor("explain", topic), 64, "no explanation of ", "'cmake --install build' in its project")
 
     def test_selftest_judges_the_phones_of_a_project(self):
         self.assertEqual(quazor("new", self.directory / "event_count").returncode, 0)

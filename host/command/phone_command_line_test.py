@@ -86,6 +86,9 @@ class PhoneListTest(CommandLineTest):
         self.assertEqual(complete("phone", "probe", ""), [])
 
 
+LISTED = "; 'quazor list' shows what is available, and '--plugin FILE' loads a plug-in that is not installed"
+
+
 class PhoneNamesTest(CommandLineTest):
     def refuse(self, code, text, *arguments):
         with self.subTest(arguments):
@@ -98,7 +101,7 @@ class PhoneNamesTest(CommandLineTest):
         self.refuse(66, "--phone camera_sync: this is a group of phones; to see them: quazor phone list 'camera_sync/*'",
                     *run, "camera_sync")
         self.refuse(66, "--phone nope: the file does not exist, and no installed phone has this name; 'quazor phone list' "
-                    "shows them", *run, "nope")
+                    "shows them, and one that is not installed is given by its file", *run, "nope")
         result = quazor(*run, "linux:nope")
         self.assert_refused(result, 66, "--phone linux:nope: the file does not exist; the installed bindings are ")
         self.assertNotIn("simulated", result.stderr)
@@ -112,8 +115,8 @@ class PhoneNamesTest(CommandLineTest):
 
     def test_unknown_names_lead_to_the_list(self):
         for what, name, command in (("diagnostic or experiment", "Camra", "list"), ("diagnostic or experiment", "Foo", "describe")):
-            self.refuse(64, f"there is no {what} '{name}'; 'quazor list' shows what is available", command, name)
-        self.refuse(64, "no diagnostic matches 'Foo*'; 'quazor list' shows what is available", "run", "Foo*")
+            self.refuse(64, f"there is no {what} '{name}'{LISTED}", command, name)
+        self.refuse(64, f"no diagnostic matches 'Foo*'{LISTED}", "run", "Foo*")
 
     def test_a_name_of_a_plug_in_that_is_loaded_only_when_named(self):
         name = "NimbeImageExperiment"

@@ -1,6 +1,7 @@
 #include "host/command/plugin_review.h"
 
 #include "base/text/input_error.h"
+#include "base/text/name_list.h"
 #include "contract/message_format.h"
 #include "host/command/explanations.h"
 #include "host/command/selection.h"
@@ -283,12 +284,10 @@ class PluginReview {
       if (!isExplained_(name)) unexplained.push_back(name);
     }
     if (unexplained.empty()) return;
-    std::string list;
-    for (const std::string& name : unexplained) list += (list.empty() ? "" : ", ") + name;
     tell(Rating::kAdvice, "explanations",
          formatMessage("none of %@; write explanations/%@.json beside the plug-in and install it "
                        "(docs/explanations.md)",
-                       list, plugin_.stem().string()));
+                       listText(unexplained), plugin_.stem().string()));
   }
 
   void reviewRun(const ResolvedDiagnostic& one) {

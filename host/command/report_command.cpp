@@ -10,6 +10,7 @@
 #include "host/report/page/comparison.h"
 #include "host/report/page/page.h"
 #include "host/report/timeline.h"
+#include "host/system/user_directory.h"
 #include "host/text/table.h"
 
 #include <filesystem>
@@ -56,6 +57,7 @@ ShownRun shownRun(const RecordedRun& run, const std::filesystem::path& file) {
 PageOptions pageOptions(const Installation& installation) {
   PageOptions options;
   options.adviceOf = explanationFinder(installation.explanations());
+  options.library = plotLibraryIn(sharedDataDirectories());
   return options;
 }
 

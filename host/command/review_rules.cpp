@@ -1,6 +1,8 @@
 #include "host/command/review_rules.h"
 
 #include "base/text/control_characters.h"
+#include "base/text/letter_case.h"
+#include "base/text/name_list.h"
 #include "contract/message_format.h"
 #include "host/text/display_width.h"
 #include "host/text/table.h"
@@ -43,13 +45,7 @@ bool isMisread(char unit) {
   return std::string_view(" *?[]:=,'\"\\$`&|;<>(){}#!~/").find(unit) != std::string_view::npos;
 }
 
-// The first names, and how many more there are.
-std::string listed(const std::vector<std::string>& names) {
-  std::string list;
-  for (std::size_t i = 0; i < std::min(names.size(), kMaxListed); ++i) list += (i == 0 ? "" : ", ") + names[i];
-  if (names.size() > kMaxListed) list += " and " + std::to_string(names.size() - kMaxListed) + " more";
-  return list;
-}
+std::string listed(const std::vector<std::string>& names) { return listText(names, kMaxListed); }
 
 // Units by the symbols of the International System, and the counts that diagnostics use.
 bool isKnownUnit(const std::string& symbol) {
@@ -129,13 +125,10 @@ ReviewFindings reviewName(std::string_view kind, const std::string& name) {
                                       name, kind)});
   }
   if (name.find(kind) == std::string::npos) {
-    findings.push_back(
-        {Rating::kAdvice, subject,
-         formatMessage("'%@' does not say that it is a%@ %@; users see such names side by side, so "
-                       "put the word %@ into it",
-                       name, kind.starts_with('D') ? "" : "n",
-                       std::string(1, static_cast<char>(kind.front() - 'A' + 'a')) + std::string(kind.substr(1)),
-                       kind)});
+    findings.push_back({Rating::kAdvice, subject,
+                        formatMessage("'%@' does not say that it is a%@ %@; users see such names side by side, so "
+                                      "put the word %@ into it",
+                                      name, kind.starts_with('D') ? "" : "n", withSmallLetters(kind), kind)});
   }
   if (widthOf(name) > kMaxName) {
     findings.push_back({Rating::kAdvice, subject,

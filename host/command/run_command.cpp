@@ -200,7 +200,8 @@ void requirePhone(const std::filesystem::path& file, const Options& options, con
   refuseGroupOfPhones(file.string(), ExitCode::kCannotRead, "--phone " + options.phone.string(), installation);
   throw CommandError(ExitCode::kCannotRead, text +
                                                 "the file does not exist, and no installed phone has this name; "
-                                                "'quazor phone list' shows them");
+                                                "'quazor phone list' shows them, and one that is not installed is "
+                                                "given by its file");
 }
 
 void addFilesOf(const std::vector<Profile>& profiles, std::vector<std::filesystem::path>& files) {

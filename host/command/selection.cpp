@@ -301,7 +301,9 @@ std::vector<std::string> wantedScenarios(const std::vector<std::string>& names, 
     const bool found = wanted.size() > before || std::find(wanted.begin(), wanted.end(), name) != wanted.end();
     if (found) continue;
     refuseGroupOfPhones(name, ExitCode::kUsage, name, installation);
-    throw CommandError(ExitCode::kUsage, "no installed phone is called '" + name + "'" + didYouMeanPath(name, all));
+    std::string wayOut = didYouMeanPath(name, all);
+    if (wayOut.empty()) wayOut = "; 'quazor phone list' shows them, and one that is not installed is given by its file";
+    throw CommandError(ExitCode::kUsage, formatMessage("no installed phone is called '%@'%@", name, wayOut));
   }
   return wanted;
 }

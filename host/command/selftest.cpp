@@ -1,6 +1,7 @@
 #include "host/command/selftest.h"
 
 #include "base/text/letter_case.h"
+#include "base/text/name_list.h"
 #include "contract/message_format.h"
 #include "contract/ordered_map.h"
 #include "host/error/host_error.h"
@@ -26,11 +27,7 @@ std::optional<ExpectedError> partsOf(const DiagnosticErrorPtr& error) {
   return ExpectedError{error->domain(), error->code(), error->localizedDescription()};
 }
 
-std::string listText(const std::vector<std::string>& names) {
-  std::string text;
-  for (const std::string& name : names) text += (text.empty() ? "" : ", ") + name;
-  return text.empty() ? "none" : text;
-}
+std::string namesText(const std::vector<std::string>& names) { return names.empty() ? "none" : listText(names); }
 
 std::vector<std::string> failedResultsOf(const DiagnosticRecord& record) {
   std::vector<std::string> names;
@@ -97,7 +94,7 @@ std::string differenceOf(const ExpectedOutcome& expected, const DiagnosticRecord
   std::vector<Comparison> comparisons = {
       {"the verdict", expected.verdict, std::string(nameOf(record.verdict))},
       {"the error", errorText(expected.error), errorText(partsOf(error))},
-      {"the failed results", listText(expected.failedResults), listText(failedResultsOf(record))}};
+      {"the failed results", namesText(expected.failedResults), namesText(failedResultsOf(record))}};
   if (expected.underlying) {
     const DiagnosticErrorPtr underlying = error == nullptr ? nullptr : error->underlyingError();
     comparisons.push_back({"the underlying error", errorText(expected.underlying), errorText(partsOf(underlying))});

@@ -40,6 +40,20 @@ class ShortReportTest(RecordTest):
                 explained = quazor(*shlex.split(result.stdout.splitlines()[-1].removeprefix("Next: "))[1:])
                 self.assertEqual(explained.returncode, 0, explained.stderr)
 
+    def test_every_result_that_failed_is_explained(self):
+        result = quazor("run", "CameraSyncDiagnostic.Back", "SingleCameraDiagnostic", *(
+            word for name in ("BackTele.Total", "BackWide.Frames", "BackWide.FrameOffset", "BackTele.Frames", "Jitter")
+            for word in ("--limit", f"{name} < -1000")))
+        self.assertEqual(result.returncode, 1, result.stderr)
+        *commands, more = result.stdout.split("Next: ")[1].splitlines()
+        topics = [topic for command in commands for topic in shlex.split(command)[2:]]
+        self.assertEqual((len(topics), topics[-1], more), (4, "Jitter", "      and 1 more"), commands)
+        for command in commands:
+            explained = quazor(*shlex.split(command)[1:])
+            self.assertEqual(explained.returncode, 0, explained.stderr)
+            for topic in shlex.split(command)[2:]:
+                self.assertIn(f"{topic}\n", explained.stdout)
+
     def test_an_error_is_explained_by_its_domain_and_code(self):
         result = quazor("run", "CameraSyncDiagnostic.Back", "--phone", "camera_sync/start_refused_on_first")
         self.assertEqual(result.returncode, 2, result.stderr)

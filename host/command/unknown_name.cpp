@@ -81,7 +81,9 @@ void refuseUnknownName(const std::vector<Diagnostic>& catalogue, const Options& 
   refusePhoneAsName(*name, installation);
   const std::string text = refusal.what();
   if (text.ends_with("?")) return;  // it has a suggestion
-  throw CommandError(ExitCode::kUsage, text + "; 'quazor list' shows what is available");
+  throw CommandError(ExitCode::kUsage, text +
+                                           "; 'quazor list' shows what is available, and '--plugin FILE' loads a "
+                                           "plug-in that is not installed");
 }
 
 }  // namespace quazor

@@ -166,6 +166,11 @@ std::vector<LimitCheck> checksOfResult(const std::vector<LimitCheck>& checks, st
   return wanted;
 }
 
+std::size_t warningsIn(const std::vector<LimitCheck>& checks) {
+  return static_cast<std::size_t>(
+      std::count_if(checks.begin(), checks.end(), [](const LimitCheck& one) { return one.warns(); }));
+}
+
 std::optional<QZLimit> boundsOf(const LimitCheck& check) {
   if (std::holds_alternative<RelationCondition>(check.limit.condition)) return std::nullopt;
   QZLimit bounds(labelOf(check.limit));

@@ -56,6 +56,9 @@ ResultVerdict verdictOf(const JudgedResult& one, const std::vector<LimitCheck>& 
 // Those of `checks` that compare the result at `index`.
 std::vector<LimitCheck> checksOfResult(const std::vector<LimitCheck>& checks, std::size_t index);
 
+// The number of checks that only warn.
+std::size_t warningsIn(const std::vector<LimitCheck>& checks);
+
 // The limit as plain bounds in the unit of the result, with labelOf() as its name; nothing for a relation. All bounds
 // are finite.
 std::optional<QZLimit> boundsOf(const LimitCheck& check);

@@ -1,5 +1,6 @@
 #include "host/record/record_place.h"
 
+#include "base/text/name_list.h"
 #include "host/error/exit_code.h"
 #include "host/text/timestamp.h"
 
@@ -89,12 +90,8 @@ void refuseFolderAsRecord(const fs::path& given) {
   std::error_code ignored;
   if (!fs::is_directory(given, ignored)) return;
   const std::vector<fs::path> records = recordsInFolder(given);
-  std::string list;
-  for (std::size_t i = 0; i < std::min(records.size(), kMaxListed); ++i) {
-    list += (i == 0 ? "" : ", ") + records[records.size() - 1 - i].string();
-  }
-  if (records.size() > kMaxListed) list += " and " + std::to_string(records.size() - kMaxListed) + " more";
-  refuseFolder(given, "is not a record; name one of the records in it: " + list);
+  const std::vector<std::string> newestFirst(records.rbegin(), records.rend());
+  refuseFolder(given, "is not a record; name one of the records in it: " + listText(newestFirst, kMaxListed));
 }
 
 }  // namespace quazor

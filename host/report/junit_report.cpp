@@ -17,10 +17,6 @@ namespace quazor {
 
 namespace {
 
-std::string valueText(const Measurement& measurement) {
-  return formatMessage("%@ %@", measurement.value(), measurement.unit().symbol());
-}
-
 void addParameters(JUnitProperties& properties, std::string_view part,
                    const std::vector<ResolvedParameter>& parameters) {
   for (const ResolvedParameter& one : parameters) {
@@ -58,9 +54,7 @@ void addResult(JUnitSuite& suite, const JudgedResult& judged) {
     return suite.addError(result.name(), properties, hostError(HostErrorCode::kCannotBeJudged, judged.problem));
   }
   if (judged.verdict != ResultVerdict::kFail) return suite.addPass(result.name(), properties);
-  suite.addFailure(
-      result.name(), properties,
-      formatMessage("%@ is %@, limit %@", result.name(), valueText(result.measurement()), limitText(result.limit())));
+  suite.addFailure(result.name(), properties, againstLimitText(result, limitText(result.limit())));
 }
 
 // A failed limit that only warns is a passed case with the verdict "warn". One on a result that is an error by its own
@@ -84,9 +78,7 @@ void addCheck(JUnitSuite& suite, const LimitCheck& check) {
   if (!check.problem.empty()) {
     return suite.addError(name, properties, hostError(HostErrorCode::kCannotBeJudged, check.problem));
   }
-  suite.addFailure(
-      name, properties,
-      formatMessage("%@ is %@, limit %@", check.result.name(), valueText(measurement), labelOf(check.limit)));
+  suite.addFailure(name, properties, againstLimitText(check.result, labelOf(check.limit)));
 }
 
 // Adds the measurements of an experiment on its own.

@@ -154,18 +154,15 @@ Json diagnosisJson(const JudgedResult& judged, bool known) {
   const QZMeasuredResult& result = judged.result;
   return {{"verdict", result.name() + ending},
           {"type", type},
-          {"message", formatMessage("%@ is %@ %@, limit %@", result.name(), result.measurement().value(),
-                                    result.measurement().unit().symbol(), limitText(result.limit()))}};
+          {"message", againstLimitText(result, limitText(result.limit()))}};
 }
 
 Json diagnosisJson(const LimitCheck& check, bool known) {
   const char* const type = !known ? "UNKNOWN" : check.passed ? "PASS" : "FAIL";
   const char* const ending = !known ? "-limit-unknown" : check.passed ? "-limit-pass" : "-limit-fail";
-  const Measurement& measurement = check.result.measurement();
   return {{"verdict", check.result.name() + ending},
           {"type", type},
-          {"message", formatMessage("%@ is %@ %@, limit %@", check.result.name(), measurement.value(),
-                                    measurement.unit().symbol(), labelOf(check.limit))}};
+          {"message", againstLimitText(check.result, labelOf(check.limit))}};
 }
 
 // A limit with bounds becomes validators of the measurement if it counts and could be compared.

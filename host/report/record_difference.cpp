@@ -17,10 +17,6 @@ namespace {
 // The facts to compare: user-readable text by user-readable name.
 using Facts = OrderedMap<std::string>;
 
-std::string measurementText(const Measurement& measurement) {
-  return formatMessage("%@ %@", measurement.value(), measurement.unit().symbol());
-}
-
 std::string oneLine(const DiagnosticErrorPtr& error) {
   std::string text = error == nullptr ? std::string("none") : errorText(error, "");
   if (text.ends_with('\n')) text.pop_back();
@@ -47,12 +43,11 @@ Facts factsOf(const DiagnosticRecord& record) {
     }
   }
   for (const auto& [name, measurement] : record.measurements) {
-    setFact(facts, "measurement " + name, measurementText(measurement));
+    setFact(facts, "measurement " + name, valueText(measurement));
   }
   for (const auto& [result, verdict, ignored] : record.measuredResults) {
-    setFact(
-        facts, "result " + result.name(),
-        formatMessage("%@, %@, %@", measurementText(result.measurement()), limitText(result.limit()), nameOf(verdict)));
+    setFact(facts, "result " + result.name(),
+            formatMessage("%@, %@, %@", valueText(result.measurement()), limitText(result.limit()), nameOf(verdict)));
   }
   for (const LimitCheck& check : limitChecksOf(record)) {
     setFact(facts, formatMessage("limit '%@' of %@", canonicalText(check.limit), check.result.name()),

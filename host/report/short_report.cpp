@@ -1,5 +1,6 @@
 #include "host/report/short_report.h"
 
+#include "base/text/name_list.h"
 #include "contract/message_format.h"
 #include "host/model/limit_check.h"
 #include "host/model/trials.h"
@@ -20,7 +21,8 @@ namespace quazor {
 namespace {
 
 // Telling more would push the other diagnostics off the screen.
-constexpr std::size_t kMaxNamed = 3;
+constexpr std::size_t kMaxNamed = 3;  // of a diagnostic
+constexpr std::size_t kMaxAsked = 12;
 
 std::vector<ResultVerdict> verdictsOf(const DiagnosticRecord& record, const std::vector<LimitCheck>& checks) {
   std::vector<ResultVerdict> verdicts;
@@ -42,18 +44,10 @@ std::vector<std::string> failedResults(const DiagnosticRecord& record) {
   return names;
 }
 
-// "A, B, C and 57 more".
-std::string listText(const std::vector<std::string>& names) {
-  std::string text;
-  for (std::size_t i = 0; i < std::min(names.size(), kMaxNamed); ++i) text += (i == 0 ? "" : ", ") + names[i];
-  if (names.size() > kMaxNamed) text += formatMessage(" and %@ more", names.size() - kMaxNamed);
-  return text;
-}
-
 std::string failureText(const DiagnosticRecord& record) {
   if (record.skip) return textOf(*record.skip);
   if (record.error != nullptr) return formatMessage("%@ code %@", record.error->domain(), record.error->code());
-  return listText(failedResults(record));
+  return listText(failedResults(record), kMaxNamed);
 }
 
 // A line that says what did not pass. The repetitions that ended alike share one.
@@ -94,6 +88,61 @@ std::string textOf(const FailureLine& line) {
   return line.first.empty() ? line.text : formatMessage("%@ (%@)", line.text, line.first);
 }
 
+bool holds(const std::vector<std::string>& names, const std::string& name) {
+  return std::find(names.begin(), names.end(), name) != names.end();
+}
+
+// What has an explanation: the error, or else the results that failed, or else the diagnostic.
+std::vector<std::string> explained(const DiagnosticRecord& record,
+                                   const std::function<bool(const std::string& topic)>& isExplained) {
+  std::vector<std::string> topics = topicsOf(record);
+  std::erase_if(topics, [&isExplained](const std::string& topic) { return !isExplained(topic); });
+  if (topics.size() > 1 && topics.back() == record.name) topics.pop_back();
+  return topics;
+}
+
+// The topics of the command that explains what did not pass, each once.
+// Thread: one at a time.
+class Questions {
+ public:
+  void add(const std::vector<std::string>& topicsOfOne) {
+    std::size_t ofThis = 0;
+    for (const std::string& topic : topicsOfOne) {
+      if (holds(asked_, topic)) continue;
+      if (ofThis < kMaxNamed && asked_.size() < kMaxAsked) {
+        asked_.push_back(topic);
+        ++ofThis;
+      } else if (!holds(left_, topic)) {
+        left_.push_back(topic);
+      }
+    }
+  }
+
+  void print(std::ostream& out, std::size_t columns) const {
+    if (asked_.empty()) return;
+    const std::string command = "quazor explain";
+    std::string all = "Next: " + command;
+    for (const std::string& topic : asked_) all += ' ' + shellWord(topic);
+    if (widthOf(all) <= columns) {
+      out << all << '\n';
+    } else {
+      // A command that is broken into lines cannot be pasted.
+      std::string_view before = "Next: ";
+      for (const std::string& topic : asked_)
+        out << std::exchange(before, kIndent) << command << ' ' << shellWord(topic) << '\n';
+    }
+    const auto more =
+        std::count_if(left_.begin(), left_.end(), [this](const std::string& topic) { return !holds(asked_, topic); });
+    if (more > 0) out << kIndent << "and " << more << " more\n";
+  }
+
+ private:
+  static constexpr std::string_view kIndent = "      ";
+
+  std::vector<std::string> asked_;
+  std::vector<std::string> left_;  // there is no room for them
+};
+
 void addCount(std::string& text, std::size_t number, std::string_view one, std::string_view several) {
   if (number > 0) text += formatMessage(", %@ %@", number, number == 1 ? one : several);
 }
@@ -124,8 +173,7 @@ std::string resultCountsText(const DiagnosticRecord& record) {
   addCount(text, limited, "with a limit", "with limits");
   addCount(text, countOf(ResultVerdict::kFail), "failed", "failed");
   addCount(text, countOf(ResultVerdict::kError), "not judged", "not judged");
-  const auto warnings = std::count_if(checks.begin(), checks.end(), [](const LimitCheck& one) { return one.warns(); });
-  addCount(text, static_cast<std::size_t>(warnings), "warning", "warnings");
+  addCount(text, warningsIn(checks), "warning", "warnings");
   return text;
 }
 
@@ -146,30 +194,16 @@ void printShortRecord(std::ostream& out, const DiagnosticRecord& record, bool co
 
 void printFailures(std::ostream& out, const std::vector<DiagnosticRecord>& records, bool colour,
                    const std::function<bool(const std::string& topic)>& isExplained) {
-  std::vector<std::string> asked;
+  Questions questions;
   std::vector<FailureLine> lines;
   for (std::size_t i = 0; i < records.size(); ++i) {
     const DiagnosticRecord& record = records[i];
     if (record.verdict == Verdict::kPass && !isFlaky(record)) continue;
     if (!hasLaterAttempt(records, i)) addLine(lines, lineOf(records, i, colour));
-    if (!isExplained || record.skip || record.verdict == Verdict::kPass) continue;
-    const std::vector<std::string> topics = topicsOf(record);
-    const auto found = std::find_if(topics.begin(), topics.end(), isExplained);
-    if (found != topics.end() && std::find(asked.begin(), asked.end(), *found) == asked.end()) asked.push_back(*found);
+    if (isExplained && !record.skip && record.verdict != Verdict::kPass) questions.add(explained(record, isExplained));
   }
   for (const FailureLine& line : lines) out << textOf(line) << '\n';
-  if (asked.empty()) return;
-  const std::string command = "quazor explain";
-  std::string all = "Next: " + command;
-  for (const std::string& topic : asked) all += ' ' + shellWord(topic);
-  if (widthOf(all) <= columnsOf(out)) {
-    out << all << '\n';
-    return;
-  }
-  // A command that is broken into lines cannot be pasted.
-  std::string_view before = "Next: ";
-  for (const std::string& topic : asked)
-    out << std::exchange(before, "      ") << command << ' ' << shellWord(topic) << '\n';
+  questions.print(out, columnsOf(out));
 }
 
 }  // namespace quazor

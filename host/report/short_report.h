@@ -24,7 +24,7 @@ std::vector<std::string> topicsOf(const DiagnosticRecord& record);
 
 // Prints a line for each diagnostic that did not pass or that passed only after an error, with the results that failed
 // or with its error, and then the command that explains them; nothing if all passed. The command names only what
-// `isExplained` accepts.
+// `isExplained` accepts: of each diagnostic its error, or the first of its results that failed, or else itself.
 void printFailures(std::ostream& out, const std::vector<DiagnosticRecord>& records, bool colour,
                    const std::function<bool(const std::string& topic)>& isExplained);
 

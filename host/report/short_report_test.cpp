@@ -91,18 +91,37 @@ TEST(PrintFailures, NamesWhatDidNotPassAndTheCommandThatExplainsIt) {
   EXPECT_EQ(failures({recordOf("A", Verdict::kPass)}, [](const std::string&) { return true; }), "");
 }
 
-TEST(PrintFailures, NamesNotMoreThanThreeResults) {
+DiagnosticRecord failedIn(const std::vector<std::string>& names) {
   DiagnosticRecord record = recordOf("A", Verdict::kFail);
   record.measuredResults.clear();
-  for (const char* name : {"a b", "c", "d", "e", "e", "f"}) {
+  for (const std::string& name : names) {
     QZMeasuredResult result(name, Measurement(1, QZDimensionlessUnit::events()));
     QZLimit limit("L");
     limit.setUpperBound(std::make_shared<const QZBound>(Measurement(0, QZDimensionlessUnit::events()), false));
     result.setLimit(std::move(limit));
     record.measuredResults.push_back(judgeResult(result));
   }
-  EXPECT_EQ(failures({record}, [](const std::string&) { return true; }),
-            "FAIL  A: a b, c, d and 2 more\nNext: quazor explain 'a b'\n");
+  return record;
+}
+
+bool isAnything(const std::string&) { return true; }
+
+TEST(PrintFailures, NamesNotMoreThanThreeResults) {
+  const DiagnosticRecord record = failedIn({"a b", "c", "d", "e", "e", "f"});
+  EXPECT_EQ(failures({record}, isAnything),
+            "FAIL  A: a b, c, d and 2 more\nNext: quazor explain 'a b' c d\n      and 2 more\n");
+  EXPECT_EQ(failures({record}, [](const std::string& topic) { return topic == "c" || topic == "f"; }),
+            "FAIL  A: a b, c, d and 2 more\nNext: quazor explain c f\n");
+  EXPECT_EQ(failures({record}, [](const std::string& topic) { return topic == "A"; }),
+            "FAIL  A: a b, c, d and 2 more\nNext: quazor explain A\n");
+}
+
+TEST(PrintFailures, AsksForEachTopicOnceAndNotForTooMany) {
+  std::vector<DiagnosticRecord> records = {failedIn({"a", "b", "c", "d"}), failedIn({"d", "a", "e"})};
+  EXPECT_THAT(failures(records, isAnything), testing::EndsWith("\nNext: quazor explain a b c d e\n"));
+  for (char name = 'f'; name <= 'n'; ++name) records.push_back(failedIn({std::string(1, name)}));
+  EXPECT_THAT(failures(records, isAnything),
+              testing::EndsWith("\nNext: quazor explain a b c d e f g h i j k l\n      and 2 more\n"));
 }
 
 }  // namespace

@@ -1,5 +1,6 @@
 #include "host/report/text_report.h"
 
+#include "base/text/name_list.h"
 #include "contract/message_format.h"
 #include "host/error/host_error.h"
 #include "host/model/limit_check.h"
@@ -109,12 +110,10 @@ class ResultTable {
   bool isEmpty_ = true;
 };
 
-std::size_t warningsIn(const std::vector<DiagnosticRecord>& records) {
+std::size_t warningsOf(const std::vector<DiagnosticRecord>& records) {
   std::size_t warnings = 0;
   for (const DiagnosticRecord& record : records) {
-    const std::vector<LimitCheck> checks = limitChecksOf(record);
-    warnings += static_cast<std::size_t>(
-        std::count_if(checks.begin(), checks.end(), [](const LimitCheck& one) { return one.warns(); }));
+    warnings += warningsIn(limitChecksOf(record));
   }
   return warnings;
 }
@@ -160,14 +159,7 @@ std::string count(std::size_t number, std::string_view what) {
 std::string headline(const Diagnostic& diagnostic) {
   if (!diagnostic.experimentOnly) return diagnostic.summary;
   if (diagnostic.usedBy.empty()) return "An experiment. No diagnostic uses it.";
-  std::string text = "An experiment, used by ";
-  std::string_view separator;
-  for (const std::string& user : diagnostic.usedBy) {
-    text += separator;
-    text += user;
-    separator = ", ";
-  }
-  return text + ".";
+  return "An experiment, used by " + listText(diagnostic.usedBy) + ".";
 }
 
 // The text next to the name of an experiment in a list.
@@ -181,6 +173,15 @@ std::string listedSummary(const DescribedDiagnostic& one) {
 
 std::string limitText(const std::optional<QZLimit>& limit) {
   return limit ? printable(limit->name()) + ": " + rangeText(*limit) : "-";
+}
+
+std::string valueText(const Measurement& measurement) {
+  const std::string& unit = measurement.unit().symbol();
+  return defaultText(measurement.value()) + (unit.empty() ? "" : " " + unit);
+}
+
+std::string againstLimitText(const QZMeasuredResult& result, const std::string& limit) {
+  return formatMessage("%@ is %@, limit %@", result.name(), valueText(result.measurement()), limit);
 }
 
 std::string errorText(const DiagnosticErrorPtr& error, std::string_view indent) {
@@ -261,8 +262,8 @@ void printSummary(std::ostream& out, const std::vector<DiagnosticRecord>& record
   if (counts.flaky > 0) out << ", " << count(counts.flaky, "flaky");
   if (notReached > 0) out << ", " << count(notReached, "not reached");
   if (limits > 0) out << ", " << countText(limits, "limit") << " without a result";
-  if (const std::size_t warnings = warningsIn(records); warnings > 0) {
-    out << ", " << count(warnings, warnings == 1 ? "warning" : "warnings");
+  if (const std::size_t warnings = warningsOf(records); warnings > 0) {
+    out << ", " << countText(warnings, "warning");
   }
   out << '\n';
 }

@@ -22,6 +22,12 @@ struct TextStyle {
 // The limit's name and range: "FrameTotalLimit: = 90", "Min Frame Count: >= 90", "Range: > 1, <= 2"; "-" for none.
 std::string limitText(const std::optional<QZLimit>& limit);
 
+// The value with its unit: "90 frames", "2.5" without a unit.
+std::string valueText(const Measurement& measurement);
+
+// "BackTele.Total is 87 frames, limit FrameTotalLimit: = 90".
+std::string againstLimitText(const QZMeasuredResult& result, const std::string& limit);
+
 // The error and its underlying errors, one line each, the nearest first.
 std::string errorText(const DiagnosticErrorPtr& error, std::string_view indent);
 

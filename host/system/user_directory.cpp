@@ -1,6 +1,8 @@
 #include "host/system/user_directory.h"
 
 #include <cstdlib>
+#include <sstream>
+#include <string>
 
 namespace quazor {
 
@@ -21,6 +23,16 @@ std::filesystem::path userDirectory(const char* variable, const char* below) {
     directory /= below;
   }
   return directory / "quazor";
+}
+
+std::vector<std::filesystem::path> sharedDataDirectories() {
+  const char* const value = std::getenv("XDG_DATA_DIRS");
+  std::istringstream list(value != nullptr && *value != '\0' ? value : "/usr/local/share:/usr/share");
+  std::vector<std::filesystem::path> directories;
+  for (std::string one; std::getline(list, one, ':');) {
+    if (one.starts_with('/')) directories.emplace_back(one);
+  }
+  return directories;
 }
 
 }  // namespace quazor

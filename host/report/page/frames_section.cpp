@@ -2,6 +2,7 @@
 
 #include "contract/message_format.h"
 #include "host/report/page/html.h"
+#include "host/report/page/number_column.h"
 #include "host/report/page/plot.h"
 #include "host/text/table.h"
 
@@ -11,6 +12,7 @@
 #include <cstdint>
 #include <iterator>
 #include <optional>
+#include <span>
 #include <string_view>
 
 namespace quazor {
@@ -59,7 +61,7 @@ struct StreamFacts {
   std::vector<PlotPoint> intervals;
   std::vector<Gap> gaps;
   std::uint64_t missing = 0;
-  std::vector<double> backwards;  // when a capture time is before that of the frame before, in seconds
+  std::vector<std::int64_t> backwards;  // capture times that are before that of the frame before, in nanoseconds
   std::vector<PlotPoint> offsets;
   std::optional<Spread> interval;
   std::optional<Spread> latency;
@@ -85,20 +87,29 @@ double millisecondsBetween(std::int64_t begin, std::int64_t end) {
   return static_cast<double>(end - begin) / kPerMillisecond;
 }
 
-std::vector<std::int64_t> sortedCaptures(const RecordedStream& stream) {
+std::vector<std::int64_t> capturesOf(const RecordedStream& stream) {
   std::vector<std::int64_t> times;
+  times.reserve(stream.frames.size());
   for (const TracedFrame& frame : stream.frames) times.push_back(frame.captured);
-  std::sort(times.begin(), times.end());
   return times;
 }
 
 // From the nearest of `times`, which are ascending, to `time`.
-double offsetAgainst(const std::vector<std::int64_t>& times, std::int64_t time) {
+std::int64_t offsetAgainst(const std::vector<std::int64_t>& times, std::int64_t time) {
   const auto after = std::lower_bound(times.begin(), times.end(), time);
-  if (after == times.begin()) return millisecondsBetween(*after, time);
+  if (after == times.begin()) return time - *after;
   const auto before = after - 1;
   const bool isAfterNearer = after != times.end() && *after - time < time - *before;
-  return millisecondsBetween(isAfterNearer ? *after : *before, time);
+  return time - (isAfterNearer ? *after : *before);
+}
+
+// Of each frame of the stream, in nanoseconds.
+std::vector<std::int64_t> offsetsOf(const RecordedStream& stream, const RecordedStream& reference) {
+  std::vector<std::int64_t> times = capturesOf(reference);
+  std::sort(times.begin(), times.end());
+  std::vector<std::int64_t> offsets = capturesOf(stream);
+  for (std::int64_t& time : offsets) time = offsetAgainst(times, time);
+  return offsets;
 }
 
 StreamFacts factsOf(const RecordedStream& stream, const RecordedStream& reference) {
@@ -112,7 +123,7 @@ StreamFacts factsOf(const RecordedStream& stream, const RecordedStream& referenc
     if (i == 0) continue;
     const TracedFrame& before = stream.frames[i - 1];
     facts.intervals.push_back({secondsOf(frame.captured), millisecondsBetween(before.captured, frame.captured)});
-    if (frame.captured < before.captured) facts.backwards.push_back(secondsOf(frame.captured));
+    if (frame.captured < before.captured) facts.backwards.push_back(frame.captured);
     const std::int64_t difference = frame.number - before.number;
     const std::uint64_t step = stream.stepAt(i);
     if (difference <= 0 || static_cast<std::uint64_t>(difference) <= step) continue;
@@ -120,9 +131,9 @@ StreamFacts factsOf(const RecordedStream& stream, const RecordedStream& referenc
     facts.missing += facts.gaps.back().missing;
   }
   if (&stream != &reference) {
-    const std::vector<std::int64_t> times = sortedCaptures(reference);
-    for (const TracedFrame& frame : stream.frames) {
-      facts.offsets.push_back({secondsOf(frame.captured), offsetAgainst(times, frame.captured)});
+    const std::vector<std::int64_t> offsets = offsetsOf(stream, reference);
+    for (std::size_t i = 0; i < offsets.size(); ++i) {
+      facts.offsets.push_back({secondsOf(stream.frames[i].captured), millisecondsBetween(0, offsets[i])});
     }
   }
   facts.interval = spreadOf(valuesOf(facts.intervals));
@@ -169,13 +180,26 @@ std::string sentenceOf(const RecordedStream& stream, const StreamFacts& facts, c
   return text;
 }
 
-std::string plotsOf(const RecordedStream& stream, const StreamFacts& facts, const RecordedStream& reference) {
+bool hasManyFramesIn(const RecordedStream& stream) { return stream.frames.size() > kMaxPlotPoints; }
+
+// Numbers for the script. A template shows nothing and runs nothing.
+std::string columnOf(const char* name, std::span<const std::int64_t> numbers) {
+  return element("template class=\"" + std::string(name) + "\"", numberColumn(numbers));
+}
+
+std::string plotsOf(const RecordedStream& stream, const StreamFacts& facts, const RecordedStream& reference,
+                    bool isZoomed) {
   std::string html;
-  std::vector<double> marks = facts.backwards;
-  for (const Gap& gap : facts.gaps) marks.push_back(secondsOf(stream.frames[gap.after + 1].captured));
-  std::sort(marks.begin(), marks.end());
-  const auto add = [&html](const std::string& caption, const std::string& svg) {
-    if (!svg.empty()) html += element("figure", element("figcaption", caption) + svg);
+  std::vector<std::int64_t> marked = facts.backwards;
+  for (const Gap& gap : facts.gaps) marked.push_back(stream.frames[gap.after + 1].captured);
+  std::sort(marked.begin(), marked.end());
+  std::vector<double> marks;
+  marks.reserve(marked.size());
+  for (const std::int64_t time : marked) marks.push_back(secondsOf(time));
+  if (isZoomed) html += columnOf("captured", capturesOf(stream)) + columnOf("marks", marked);
+  const auto add = [&html, isZoomed](const std::string& caption, const std::string& svg, const std::string& column) {
+    if (svg.empty()) return;
+    html += element(isZoomed ? "figure class=\"zoom\"" : "figure", element("figcaption", caption) + svg + column);
   };
   if (facts.interval) {
     const bool isMarked = !marks.empty();
@@ -186,7 +210,8 @@ std::string plotsOf(const RecordedStream& stream, const StreamFacts& facts, cons
                  std::move(marks),
                  facts.interval->median,
                  {},
-                 kLeastSpan}));
+                 kLeastSpan}),
+        {});
   }
   if (facts.offset) {
     add("Offset against " + htmlName(reference.name) + ", the stream that began first, in ms",
@@ -196,9 +221,10 @@ std::string plotsOf(const RecordedStream& stream, const StreamFacts& facts, cons
                  {},
                  facts.offset->median,
                  {},
-                 kLeastSpan}));
+                 kLeastSpan}),
+        isZoomed ? columnOf("offsets", offsetsOf(stream, reference)) : std::string());
   }
-  return html;
+  return isZoomed ? element("div class=\"stream\"", html) : html;
 }
 
 std::string rowOf(const RecordedStream& stream, const StreamFacts& facts) {
@@ -212,7 +238,9 @@ std::string rowOf(const RecordedStream& stream, const StreamFacts& facts) {
 
 }  // namespace
 
-std::string framesSection(const std::vector<RecordedStream>& streams, int level, bool plots) {
+bool hasManyFrames(const std::vector<RecordedStream>& streams) { return std::ranges::any_of(streams, hasManyFramesIn); }
+
+std::string framesSection(const std::vector<RecordedStream>& streams, int level, ManyFrames many) {
   const RecordedStream* reference = nullptr;
   for (const RecordedStream& stream : streams) {
     if (stream.frames.empty()) continue;
@@ -228,7 +256,13 @@ std::string framesSection(const std::vector<RecordedStream>& streams, int level,
     rows += rowOf(stream, facts);
     details += heading(level + 1, "Stream " + htmlName(stream.name)) + wholeName(stream.name) +
                element("p", htmlText(sentenceOf(stream, facts, *reference)));
-    if (plots) details += plotsOf(stream, facts, *reference);
+    details += plotsOf(stream, facts, *reference, many == ManyFrames::kZoomed && hasManyFramesIn(stream));
+  }
+  if (many == ManyFrames::kNoLibrary && hasManyFrames(streams)) {
+    details +=
+        element("p class=\"soft\"",
+                "A plot shows the minimum and the maximum of each of its columns. It can be zoomed in a page that "
+                "is written where dygraphs is installed (Debian's package libjs-dygraphs).");
   }
   const bool isOne = streams.size() == 1;
   return heading(level, "Frames") +

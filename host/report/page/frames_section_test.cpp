@@ -1,5 +1,7 @@
 #include "host/report/page/frames_section.h"
 
+#include "host/report/page/plot.h"
+
 #include <gmock/gmock.h>
 #include <gtest/gtest.h>
 
@@ -23,7 +25,7 @@ RecordedStream streamOf(const std::string& name, const std::vector<std::pair<std
 
 TEST(FramesSection, SaysWhichFramesAreMissing) {
   const std::string html =
-      framesSection({streamOf("wide", {{5, 100}, {6, 133}, {9, 232}, {10, 265}, {12, 331}})}, 3, true);
+      framesSection({streamOf("wide", {{5, 100}, {6, 133}, {9, 232}, {10, 265}, {12, 331}})}, 3, ManyFrames::kPictures);
   EXPECT_THAT(html,
               HasSubstr("5 frames, captured from 0.1 s to 0.331 s, at a median interval of 66 ms. 3 frame numbers "
                         "are missing, at 2 places, the first after frame 6 at 0.133 s."));
@@ -34,14 +36,15 @@ TEST(FramesSection, SaysWhichFramesAreMissing) {
 }
 
 TEST(FramesSection, SaysThatNoneIsMissing) {
-  const std::string html = framesSection({streamOf("wide", {{0, 0}, {1, 33}})}, 3, true);
+  const std::string html = framesSection({streamOf("wide", {{0, 0}, {1, 33}})}, 3, ManyFrames::kPictures);
   EXPECT_THAT(html, HasSubstr("No frame number is missing."));
   EXPECT_THAT(html, Not(HasSubstr("class=\"mark\"")));
 }
 
 TEST(FramesSection, ComparesWithTheStreamThatBeganFirst) {
-  const std::string html = framesSection(
-      {streamOf("tele", {{0, 12}, {1, 43}, {2, 80}}), streamOf("wide", {{0, 10}, {1, 43}, {2, 76}})}, 3, true);
+  const std::string html =
+      framesSection({streamOf("tele", {{0, 12}, {1, 43}, {2, 80}}), streamOf("wide", {{0, 10}, {1, 43}, {2, 76}})}, 3,
+                    ManyFrames::kPictures);
   EXPECT_THAT(html, HasSubstr("Against the nearest frame of wide, they were captured 0 ms to 4 ms later, in the median "
                               "2 ms."));
   EXPECT_THAT(html, HasSubstr("Offset against wide</th>"));
@@ -53,13 +56,14 @@ TEST(FramesSection, DoesNotMissFramesThatAreLeftOutOfTheRecord) {
   RecordedStream stream = streamOf("wide", {{0, 0}, {1, 33}, {3, 99}, {5, 165}, {9, 297}});
   stream.steps = {{0, 1}, {2, 2}};
   stream.lost = 7;
-  const std::string html = framesSection({stream}, 3, true);
+  const std::string html = framesSection({stream}, 3, ManyFrames::kPictures);
   EXPECT_THAT(html, HasSubstr("2 frame numbers are missing, at 1 place, the first after frame 5"));
   EXPECT_THAT(html, HasSubstr("In the end, 1 of 2 frames was recorded. 7 frames could not be recorded."));
 }
 
 TEST(FramesSection, MarksCaptureTimesThatGoBack) {
-  const std::string html = framesSection({streamOf("wide", {{0, 100}, {1, 133}, {2, 90}, {3, 199}})}, 3, true);
+  const std::string html =
+      framesSection({streamOf("wide", {{0, 100}, {1, 133}, {2, 90}, {3, 199}})}, 3, ManyFrames::kPictures);
   EXPECT_THAT(html, HasSubstr("1 capture time is before that of the frame before."));
   EXPECT_THAT(html, HasSubstr("class=\"mark\""));
 }
@@ -75,18 +79,35 @@ TEST(CamerasParagraph, NamesStreamsAndMaster) {
             "<p class=\"soft\">Master, which offsets between cameras refer to: FrontCamera.</p>");
 }
 
-TEST(FramesSection, CanBeWithoutPlots) {
-  EXPECT_THAT(framesSection({streamOf("wide", {{0, 0}, {1, 33}})}, 3, false), Not(HasSubstr("<svg")));
+RecordedStream longStream(const std::string& name, std::size_t frames) {
+  RecordedStream stream{name, {}, 0};
+  for (std::size_t i = 0; i < frames; ++i) {
+    const auto time = static_cast<std::int64_t>(i) * 1'000;
+    stream.frames.push_back({static_cast<std::int64_t>(i), time, time, {}});
+  }
+  return stream;
+}
+
+TEST(FramesSection, HasTheFramesThatAPictureCannotShow) {
+  const std::vector<RecordedStream> few = {longStream("wide", kMaxPlotPoints)};
+  const std::vector<RecordedStream> many = {longStream("wide", kMaxPlotPoints + 1)};
+  EXPECT_FALSE(hasManyFrames(few));
+  EXPECT_TRUE(hasManyFrames(many));
+  EXPECT_THAT(framesSection(few, 3, ManyFrames::kZoomed), Not(HasSubstr("<template")));
+  EXPECT_THAT(framesSection(many, 3, ManyFrames::kPictures), Not(HasSubstr("<template")));
+  EXPECT_THAT(framesSection(many, 3, ManyFrames::kZoomed), HasSubstr("<template class=\"captured\">"));
+  EXPECT_THAT(framesSection(few, 3, ManyFrames::kNoLibrary), Not(HasSubstr("libjs-dygraphs")));
+  EXPECT_THAT(framesSection(many, 3, ManyFrames::kNoLibrary), HasSubstr("libjs-dygraphs"));
 }
 
 TEST(FramesSection, IsEmptyWithoutFrames) {
-  EXPECT_EQ(framesSection({}, 3, true), "");
-  EXPECT_EQ(framesSection({streamOf("wide", {})}, 3, true), "");
+  EXPECT_EQ(framesSection({}, 3, ManyFrames::kPictures), "");
+  EXPECT_EQ(framesSection({streamOf("wide", {})}, 3, ManyFrames::kPictures), "");
 }
 
 TEST(FramesSection, TakesTheLargestTimes) {
   RecordedStream stream{"wide", {{0, -kMaxTraced, 0, {}}, {kMaxTraced, kMaxTraced, kMaxTraced, {}}}, 0};
-  EXPECT_THAT(framesSection({stream}, 3, true), HasSubstr("2 frames"));
+  EXPECT_THAT(framesSection({stream}, 3, ManyFrames::kPictures), HasSubstr("2 frames"));
 }
 
 }  // namespace

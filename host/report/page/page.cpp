@@ -3,6 +3,7 @@
 #include "contract/message_format.h"
 #include "host/model/trials.h"
 #include "host/report/page/document.h"
+#include "host/report/page/frames_section.h"
 #include "host/report/page/html.h"
 #include "host/report/page/results_table.h"
 #include "host/report/page/run_facts.h"
@@ -66,10 +67,15 @@ std::string verdictsText(const std::vector<ShownRun>& runs) {
 
 std::string pageOfOne(const ShownRun& run, const PageOptions& options) {
   const PageVerdict verdict = verdictOf(run);
+  const bool hasMany = options.frames && std::ranges::any_of(run.streams, hasManyFrames);
+  const PlotLibrary* const library = hasMany && options.library ? &*options.library : nullptr;
+  const ManyFrames many = library == nullptr ? ManyFrames::kNoLibrary : ManyFrames::kZoomed;
   return document(
       verdict.word + ": " + htmlName(shortPhone(run.began)),
       bannerOf(verdict.kind, verdict.word, deviceText({run.began}), htmlText(summaryOf(run)), factsOf(run.began)) +
-          element("main", "\n" + verdictsText({run}) + runSections(run, 1, 2, options)) + "\n" + footerOf(run.began));
+          element("main", "\n" + verdictsText({run}) + runSections(run, 1, 2, options, many)) + "\n" +
+          footerOf(run.began, library),
+      library);
 }
 
 std::string pageOfMany(const std::vector<ShownRun>& runs, const PageOptions& options) {
@@ -77,6 +83,7 @@ std::string pageOfMany(const std::vector<ShownRun>& runs, const PageOptions& opt
   PageVerdict worst = verdictOf(runs.front());
   std::string sections;
   std::vector<RunStarted> began;
+  began.reserve(runs.size());
   for (const ShownRun& run : runs) began.push_back(run.began);
   for (std::size_t i = 0; i < runs.size(); ++i) {
     const PageVerdict verdict = verdictOf(runs[i]);
@@ -87,7 +94,7 @@ std::string pageOfMany(const std::vector<ShownRun>& runs, const PageOptions& opt
         "<section id=\"run%@\" aria-labelledby=\"run%@title\">\n<h2 id=\"run%@title\">Run %@: %@ "
         "%@</h2>\n%@</section>\n",
         i + 1, i + 1, i + 1, i + 1, htmlName(shortPhone(runs[i].began)), verdictBadge(verdict.kind),
-        runSections(runs[i], i + 1, 3, options));
+        runSections(runs[i], i + 1, 3, options, ManyFrames::kPictures));
   }
   const std::string sentence = countText(runs.size(), "run") + ": " + std::to_string(passed) + " passed, " +
                                std::to_string(runs.size() - passed) + " did not";

@@ -3,6 +3,7 @@
 #include "base/text/base64.h"
 #include "base/text/sha256.h"
 #include "host/error/host_error.h"
+#include "host/report/page/plot.h"
 #include "host/testing/test_records.h"
 
 #include <gmock/gmock.h>
@@ -70,6 +71,29 @@ TEST(ReportPage, SaysWhatToDo) {
   EXPECT_EQ(countOf(page, "<li>A loose plug</li>"), 1U);
   EXPECT_THAT(page, HasSubstr("<strong>Frames were lost</strong>: see <a href=\"#run1-1-finding\">above</a>"));
   EXPECT_THAT(asked, testing::Contains("Count"));
+}
+
+TEST(ReportPage, HasScriptsOnlyForMoreFramesThanAPictureShows) {
+  PageOptions options;
+  options.library = PlotLibrary{"draw()", "chart{}", "free <for all>"};
+  SampleRun run({recordOf("A", Verdict::kPass)});
+  run.streams = {{{"wide", std::vector<TracedFrame>(kMaxPlotPoints), 0}}};
+  EXPECT_THAT(run.page(options), Not(HasSubstr("<script")));
+  run.streams[0][0].frames.push_back({0, 0, 0, {}});
+  const std::string page = run.page(options);
+  EXPECT_THAT(page, HasSubstr("<script>draw()</script>"));
+  EXPECT_THAT(page, HasSubstr("; script-src 'sha256-" + base64(sha256("draw()")) + "' 'sha256-"));
+  EXPECT_THAT(page, HasSubstr("<style>chart{}</style>"));
+  EXPECT_THAT(page, HasSubstr("free &lt;for all&gt;"));
+  EXPECT_THAT(page, HasSubstr("its only scripts draw the plots"));
+  const auto isWithoutScripts = [](const std::string& text) {
+    return text.find("<script") == std::string::npos && text.find("script-src") == std::string::npos &&
+           text.find("runs no script") != std::string::npos;
+  };
+  EXPECT_TRUE(isWithoutScripts(run.page()));
+  EXPECT_TRUE(isWithoutScripts(reportPage({run.shown(), run.shown()}, options)));
+  options.frames = false;
+  EXPECT_TRUE(isWithoutScripts(run.page(options)));
 }
 
 TEST(ReportPage, SaysWhatTheRunAlreadyShows) {

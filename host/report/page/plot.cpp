@@ -18,7 +18,7 @@ constexpr double kHeightOfCurves = 1.2;  // the height of the plot is that many 
 constexpr double kTextHeight = 12;
 constexpr double kHalfText = 4;
 constexpr int kLabelDigits = 4;
-constexpr std::size_t kColumns = 320;
+constexpr std::size_t kColumns = kMaxPlotPoints / 2;
 
 // Maps a range of numbers to coordinates.
 struct Scale {
@@ -45,7 +45,7 @@ std::string pathOf(const std::vector<PlotPoint>& points, const Scale& x, const S
     path += path.empty() ? "M" : "L";
     path += place(x.at(point.x), y.at(point.y));
   };
-  if (points.size() <= 2 * kColumns) {
+  if (points.size() <= kMaxPlotPoints) {
     std::for_each(points.begin(), points.end(), add);
     return path;
   }

@@ -1,6 +1,7 @@
 // A plot of values over time as SVG.
 #pragma once
 
+#include <cstddef>
 #include <string>
 #include <vector>
 
@@ -21,8 +22,11 @@ struct Plot {
   double leastSpan = 0;             // of y: smaller differences are not stretched to the height of the plot
 };
 
-// The size of the SVG is bounded: of many points, it has the minimum and the maximum of each of its columns. Empty for
-// fewer than two points.
+// The greatest number of points of a curve that a plot shows one by one.
+inline constexpr std::size_t kMaxPlotPoints = 640;
+
+// The size of the SVG is bounded: of more than kMaxPlotPoints points, it has the minimum and the maximum of each of its
+// columns. Empty for fewer than two points.
 std::string plotSvg(const Plot& plot);
 
 // Samples without a time, as curves over each other; at most 2 of them. Those that are not finite are left out.

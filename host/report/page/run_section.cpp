@@ -194,13 +194,13 @@ std::string entryText(const ShownRun& run, std::size_t number, std::size_t index
   return formatMessage("%@, entry %@ of run %@", htmlName(run.records[index].name), index + 1, number);
 }
 
-std::string framesOf(const ShownRun& run, std::size_t number, std::size_t index, int level) {
-  const std::string frames = framesSection(streamsOf(run, index), level, true);
+std::string framesOf(const ShownRun& run, std::size_t number, std::size_t index, int level, ManyFrames many) {
+  const std::string frames = framesSection(streamsOf(run, index), level, many);
   return scrolling("Frames of " + entryText(run, number, index), frames);
 }
 
 std::string diagnosticSection(const ShownRun& run, std::size_t number, std::size_t index, int level,
-                              const PageOptions& options) {
+                              const PageOptions& options, ManyFrames many) {
   const DiagnosticRecord& record = run.records[index];
   const std::string id = idOf(number, index);
   std::string body = wholeName(record.name) + element("p", htmlText(record.summary));
@@ -209,7 +209,7 @@ std::string diagnosticSection(const ShownRun& run, std::size_t number, std::size
   if (record.skip) body += element("p", htmlText(textOf(*record.skip)));
   const std::string entry = entryText(run, number, index);
   body += scrolling("Results of " + entry, resultsTable(record));
-  if (options.frames) body += framesOf(run, number, index, level + 1);
+  if (options.frames) body += framesOf(run, number, index, level + 1, many);
   body += scrolling("Counters and other data of " + entry, auxiliarySection(record, level + 1));
   body += measurementsSection(record, level + 1);
   body += scrolling("Parameters of " + entry, parametersSection(record, level + 1));
@@ -281,10 +281,11 @@ std::string summaryOf(const ShownRun& run) {
   return line;
 }
 
-std::string runSections(const ShownRun& run, std::size_t number, int level, const PageOptions& options) {
+std::string runSections(const ShownRun& run, std::size_t number, int level, const PageOptions& options,
+                        ManyFrames many) {
   std::string html = stopLine(run) + findings(run, number, level, options) + overview(run, number, level);
   html += variationOf(run);
-  for (std::size_t i = 0; i < run.records.size(); ++i) html += diagnosticSection(run, number, i, level, options);
+  for (std::size_t i = 0; i < run.records.size(); ++i) html += diagnosticSection(run, number, i, level, options, many);
   html += heading(level, "The run") + scrolling("Facts about run " + std::to_string(number), runTable(run));
   return html + rerunSection(run, level + 1);
 }

@@ -1,6 +1,7 @@
 // One run of a page: what did not pass and what to do about it, each diagnostic, the run itself.
 #pragma once
 
+#include "host/report/page/frames_section.h"
 #include "host/report/page/page.h"
 
 #include <cstddef>
@@ -22,6 +23,7 @@ PageVerdict verdictOf(const ShownRun& run);
 std::string summaryOf(const ShownRun& run);
 
 // `number` is that of the run in the page, and `level` that of the headings.
-std::string runSections(const ShownRun& run, std::size_t number, int level, const PageOptions& options);
+std::string runSections(const ShownRun& run, std::size_t number, int level, const PageOptions& options,
+                        ManyFrames many);
 
 }  // namespace quazor

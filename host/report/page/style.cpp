@@ -64,6 +64,11 @@ svg.bar{width:160px;height:16px;margin-top:.25rem}
 .axis{stroke:var(--line);stroke-width:1}.allowed{fill:var(--allowed)}.bound{stroke:var(--text);stroke-width:2}
 circle.pass{fill:var(--pass)}circle.fail{fill:var(--fail)}circle{stroke:var(--ground);stroke-width:1}
 svg.plot{width:720px}
+.chart{width:720px;max-width:100%;height:220px}.live .dygraph-axis-label,.live .dygraph-legend{color:var(--soft);
+background:none}.legend{min-height:1.5em;margin:.2rem 0}.buttons{margin:.2rem 0}
+button{font:inherit;font-size:.875rem;padding:.2rem .7rem;color:var(--text);background:var(--panel);
+border:1px solid var(--soft);border-radius:4px}
+@media screen{.live>svg{display:none}}@media print{.chart,.legend,.buttons{display:none}}
 .ground{fill:var(--panel);stroke:var(--line)}.curve,.curve0,.curve1{fill:none;stroke:var(--curve);stroke-width:1.5;
 stroke-linejoin:round}
 .curve1{stroke:var(--second)}.median{stroke:var(--soft);stroke-dasharray:4 4;fill:none}
