@@ -76,6 +76,15 @@ void addLogLimit(CLI::App& command, std::string& text) {
       ->type_name("LINES[,MEBIBYTES]|none");
 }
 
+void addHeartbeat(CLI::App& command, std::string& text) {
+  command
+      .add_option(
+          "--heartbeat", text,
+          "How often a run says on standard error that it goes on, unless that is a terminal, and in its record; "
+          "0 for never. Default 30")
+      ->type_name("SECONDS");
+}
+
 void addTrace(CLI::App& command, std::string& text) {
   command
       .add_option("--trace", text,

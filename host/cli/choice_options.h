@@ -46,6 +46,9 @@ void addChoiceOptions(CLI::App& command, ChoiceTexts& texts, const std::string& 
 // Declares --log-limit. logLimitOf() reads its text.
 void addLogLimit(CLI::App& command, std::string& text);
 
+// Declares --heartbeat. parseHeartbeat() reads its text.
+void addHeartbeat(CLI::App& command, std::string& text);
+
 // Declares --trace. traceOf() reads its text.
 void addTrace(CLI::App& command, std::string& text);
 

@@ -49,6 +49,8 @@ struct RawOptions {
   std::string format = "text";
   ChoiceTexts choice;
   ReportCommandTexts report;
+  RecordsCommandTexts ofStore;
+  std::string store;
   bool all = false;
   bool replace = false;
   bool realTime = false;
@@ -99,6 +101,7 @@ void removeMarks(RawOptions& raw) {
                             &raw.choice.repetitions, &raw.report.from, &raw.report.to}) {
     removeMark(*text);
   }
+  for (std::string* const text : textsOf(raw.ofStore)) removeMark(*text);
 }
 
 void addPlugins(CLI::App& command, RawOptions& raw) {
@@ -138,15 +141,6 @@ void addGrace(CLI::App& command, RawOptions& raw) {
   command
       .add_option("--grace", raw.grace,
                   "How long a setup or run may still take after an interrupt, before its teardown; default 5")
-      ->type_name("SECONDS");
-}
-
-void addHeartbeat(CLI::App& command, RawOptions& raw) {
-  command
-      .add_option(
-          "--heartbeat", raw.heartbeat,
-          "How often a run says on standard error that it goes on, unless that is a terminal, and in its record; "
-          "0 for never. Default 30")
       ->type_name("SECONDS");
 }
 
@@ -292,6 +286,8 @@ Options optionsOf(const CLI::App& command, const RawOptions& raw) {
   options.realTime = raw.realTime;
   options.choice = choiceOf(raw.choice);
   if (options.command == Command::kReport) options.ofRecords = recordReportOf(raw.report, raw.records);
+  if (options.command == Command::kRecords) options.ofStore = recordsRequestOf(raw.ofStore);
+  options.store = storeOf(raw.store, options.record);
   options.inProcess = raw.inProcess;
   options.seed = parseWhole("--seed", raw.seed, 0, UINT64_MAX);
   if (const CLI::Option* const seed = command.get_option_no_throw("--seed")) options.hasSeed = seed->count() > 0;
@@ -348,6 +344,7 @@ void declareRunningCommands(CLI::App& app, RawOptions& raw) {
       ->check(CLI::IsMember({"failed"}));
   run.add_option("--of", raw.of, "The record that --only refers to")->type_name("RECORD");
   addRunOptions(run, raw, "diagnostics");
+  addStore(run, raw.store);
   CLI::App& experiment = *app.add_subcommand("experiment", "Run experiments only: measure without judging");
   addNames(experiment, raw.names, "An experiment's");
   addRunOptions(experiment, raw, "experiments");
@@ -362,7 +359,7 @@ void declareRunningCommands(CLI::App& app, RawOptions& raw) {
     addReportOptions(*command, raw, formats);
     addParameterOptions(*command, raw);
     addProcessOptions(*command, raw);
-    addHeartbeat(*command, raw);
+    addHeartbeat(*command, raw.heartbeat);
     addTags(*command, raw);
   }
   for (CLI::App* const command : {&run, &analyze}) {
@@ -380,6 +377,7 @@ void declareOtherCommands(CLI::App& app, RawOptions& raw) {
   addRecords(report, raw, 1, CLI::detail::expected_max_vector_size, "The records, or folders of them");
   addReportCommandOptions(report, raw.report);
   addOutput(report, raw);
+  addOutput(declareRecordsCommand(app, raw.ofStore, raw.format), raw);
   CLI::App& explain = *app.add_subcommand("explain", "Explain an error, a diagnostic or a result, and what to do next");
   explain
       .add_option("WHAT", raw.names,

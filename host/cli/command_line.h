@@ -3,6 +3,7 @@
 
 #include "contract/log_channel.h"
 #include "host/cli/choice_options.h"
+#include "host/cli/records_command_options.h"
 #include "host/cli/report_command_options.h"
 #include "host/error/exit_code.h"
 #include "host/limits/user_limit.h"
@@ -34,6 +35,7 @@ enum class Command {
   kAnalyze,
   kDiff,
   kReport,
+  kRecords,
   kExplain,
   kDoctor,
   kSelftest,
@@ -43,9 +45,9 @@ enum class Command {
 };
 
 // In the order of the enumerators.
-inline constexpr std::string_view kCommandNames[] = {"list",     "describe", "run",        "experiment", "verify",
-                                                     "analyze",  "diff",     "report",     "explain",    "doctor",
-                                                     "selftest", "phone",    "completion", "new"};
+inline constexpr std::string_view kCommandNames[] = {"list",    "describe", "run",    "experiment", "verify",
+                                                     "analyze", "diff",     "report", "records",    "explain",
+                                                     "doctor",  "selftest", "phone",  "completion", "new"};
 
 // 'quazor help' and 'quazor help NAME' are 'quazor --help' and 'quazor NAME --help'.
 inline constexpr const char* kHelpWord = "help";
@@ -79,7 +81,9 @@ struct Options {
   std::optional<LogLevel> logLevel;
   LogLimit logLimit;  // of each diagnostic
   TraceSetting trace;
-  RecordReport ofRecords;  // what report makes of records
+  RecordReport ofRecords;       // what report makes of records
+  RecordsRequest ofStore;       // what records is asked for
+  std::filesystem::path store;  // to import the record of a run into; empty: none
   Command command = Command::kList;
   bool all = false;
   bool onlyFailed = false;

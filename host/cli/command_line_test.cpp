@@ -190,6 +190,7 @@ TEST(ParseCommandLine, KnowsItsCommands) {
                       {{"analyze", "r"}, Command::kAnalyze},
                       {{"diff", "r", "s"}, Command::kDiff},
                       {{"report", "r", "s"}, Command::kReport},
+                      {{"records", "list"}, Command::kRecords},
                       {{"explain", "206"}, Command::kExplain},
                       {{"doctor"}, Command::kDoctor},
                       {{"selftest"}, Command::kSelftest},

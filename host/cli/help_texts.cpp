@@ -41,6 +41,10 @@ constexpr Example kExamples[] = {
     {"quazor diff before.jsonl after.jsonl", "show what differs between two records"},
     {"quazor report run.jsonl --output report.html", "a page of a run for people"},
     {"quazor report run.jsonl --format trace --output run.trace.json", "a time line for a viewer of traces"},
+    {"quazor records import records/", "take records into the store, where questions are quick"},
+    {"quazor records yield --since 2026-11-16 --station S3", "how many phones passed at their first run"},
+    {"quazor records failures", "what fails most"},
+    {"quazor records capability --result '*.Jitter'", "Cpk and Ppk, or why there is none"},
     {"quazor explain QZCapturePlugInErrorDomain:206", "what an error means, and what to do next"},
     {"quazor doctor", "check the installation"},
     {"quazor doctor --plugin build/my_plugin.so", "judge a plug-in as a reviewer would"},
@@ -58,9 +62,10 @@ struct ExitCodeHelp {
 constexpr ExitCodeHelp kExitCodes[] = {
     {0, "all diagnostics passed, or all experiments returned a result", "run experiment analyze"},
     {0, "no problem was found", "verify diff doctor selftest"},
-    {0, "done", "list describe report explain phone completion new"},
+    {0, "done", "list describe report records explain phone completion new"},
     {1, "a result was outside its limits", "run analyze"},
     {1, "a problem was found", "verify diff selftest"},
+    {1, "a record was refused because something in it is wrong, or the store is wrong", "records"},
     {2, "a diagnostic or experiment ended in an error, or was skipped without --allow-skips", "run experiment"},
     {2, "a diagnostic or experiment ended in an error", "analyze describe"},
     {3, "the record has no end of a run; one that was interrupted and ended has one", "verify"},
@@ -68,9 +73,10 @@ constexpr ExitCodeHelp kExitCodes[] = {
     {64, "the command line is invalid", {}},
     {66, "a plug-in, scenario, binding, profile or record cannot be read or loaded",
      "list describe run experiment verify analyze diff report explain doctor selftest phone new"},
+    {66, "a record or the store cannot be read, or the store is of a later quazor", "records"},
     {70, "quazor itself failed", {}},
     {73, "a report or record cannot be written, or the record exists already", {}},
-    {130, "interrupted", "list describe run experiment verify analyze doctor selftest"},
+    {130, "interrupted", "list describe run experiment verify analyze records doctor selftest"},
 };
 
 bool hasWord(std::string_view words, std::string_view word) {
@@ -114,7 +120,7 @@ std::string helpFooter() {
   add(0, "all diagnostics passed, or all experiments returned a result");
   add(1, "a result was outside its limits, or verify, diff or selftest found a problem");
   for (const ExitCodeHelp& one : kExitCodes) {
-    if (one.code < 2 || one.commands.starts_with("analyze")) continue;  // told with run
+    if (one.code < 2 || one.commands.starts_with("analyze") || one.commands == "records") continue;  // told with run
     add(one.code,
         one.code == 3 ? "the run of the record did not end, or, for analyze, it was interrupted" : one.meaning);
   }

@@ -3,6 +3,7 @@
 #include "host/command/completion.h"
 #include "host/command/explain_command.h"
 #include "host/command/output_check.h"
+#include "host/command/records/records_command.h"
 #include "host/command/selection.h"
 #include "host/command/unknown_name.h"
 #include "host/plugin/diagnostic_registry.h"
@@ -93,6 +94,13 @@ ExitCode explainErrors(const Options& options, const Installation& installation,
   return ExitCode::kAllPassed;
 }
 
+ExitCode aboutRecords(const Options& options, Console& console, WatchedSignals* signals) {
+  std::ostringstream text = textFor(options.report, console);
+  const ExitCode code = recordsCommand(options.ofStore, options.report.format, text, console, signals);
+  writeOutput(options.report, console, text.str());
+  return code;
+}
+
 // Watches the signals until this process has ended: none of them may meet its default action, not even while static
 // objects are destroyed. Returns null with --in-process, where other threads may run.
 WatchedSignals* watchSignals(const Options& options) {
@@ -111,6 +119,7 @@ ExitCode perform(const Options& options, const Installation& installation, Conso
     case Command::kAnalyze: return analyzeCommand(options, installation, console, watchSignals(options));
     case Command::kDiff: return diffCommand(options, console);
     case Command::kReport: return reportCommand(options, installation, console);
+    case Command::kRecords: return aboutRecords(options, console, watchSignals(options));
     case Command::kExplain: return explainErrors(options, installation, console);
     case Command::kDoctor:
       return doctorCommand(options, installation, console, options.plugins.empty() ? nullptr : watchSignals(options));

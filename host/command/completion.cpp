@@ -106,6 +106,7 @@ class Completer {
     if (command == kHelpWord) return {std::begin(kCommandNames), std::end(kCommandNames)};
     if (command == "selftest") return installation_.scenarioNames();
     if (command == "completion") return {"bash", "zsh"};
+    if (command == "records" && words_.size() == 2) return {std::begin(kRecordsActions), std::end(kRecordsActions)};
     if (command == "phone" && words_.size() == 2) return {"list", "probe"};
     if (command == "phone") return words_[1] == "list" ? installation_.scenarioNames() : std::vector<std::string>();
     std::vector<std::string> names;

@@ -118,9 +118,8 @@ Finding verifyRecord(const std::filesystem::path& file, VerificationProgress& pr
   } catch (const RecordDefect& defect) {
     return {ExitCode::kFailed, {}, {}, {defect.what()}};
   }
-  finding.problems = problemsOf(stored.events);
+  finding.problems = problemsOfRecord(stored);
   const bool isComplete = std::holds_alternative<RunEnded>(stored.events.back());
-  if (isComplete && stored.cutOff) finding.problems.emplace_back("an incomplete line follows the end of the run");
   finding.counts = countText(stored.events.size(), "event") + ", " + verdictsText(stored.events);
   if (isComplete) finding.interrupted = interruptionText(stored.events);
   if (!isComplete) {

@@ -7,6 +7,7 @@
 #include "host/command/explanations.h"
 #include "host/command/failed_only.h"
 #include "host/command/output_check.h"
+#include "host/command/records/records_command.h"
 #include "host/command/report_command.h"
 #include "host/command/selection.h"
 #include "host/command/unknown_name.h"
@@ -83,10 +84,25 @@ RunStarted beginningOf(const Options& options, const Installation& installation,
 }
 
 // Checks the outputs and makes those that receive events. A record in a folder gets its name from the run.
+// The file of --record; empty if there is none.
+std::filesystem::path recordOf(const Options& options, const RunStarted& began) {
+  return isFolderOfRecords(options.record) ? options.record / recordNameOf(began) : options.record;
+}
+
+// Takes the record of the run into the store. The verdicts stay as they are.
+ExitCode importedInto(const std::filesystem::path& store, const std::filesystem::path& record, ExitCode code,
+                      Console& console) {
+  const std::string problem = importAfterRun(store, record);
+  if (problem.empty()) return code;
+  console.err << "quazor: the run is not in the store: " << printable(problem)
+              << "\nTo try again: quazor records import " << printable(record.string()) << '\n';
+  return code == ExitCode::kInterrupted ? code : ExitCode::kCannotWrite;
+}
+
 std::unique_ptr<EventPipeline> beginEvents(Options options, const Installation& installation, const RunStarted& began,
                                            bool keepsLastRun, Console& console) {
   const std::filesystem::path folder = isFolderOfRecords(options.record) ? options.record : "";
-  if (!folder.empty()) options.record = folder / recordNameOf(began);
+  options.record = recordOf(options, began);
   checkOutputs(options, installation, began);
   if (!folder.empty()) makeFolderOfRecords(folder);
   EventPipelineOptions outputs;
@@ -260,8 +276,11 @@ ExitCode runCommand(const Options& given, const Installation& installation, Cons
   RunStarted began = beginningOf(options, installation, jobs, selection.failed);
   began.phone = phone.name;
   began.limits = std::move(selection.limits);
-  return perform(options, installation, console, std::move(began), jobs, selection.failed, runOptions, phone.make,
-                 signals);
+  const std::filesystem::path record = recordOf(options, began);
+  if (!options.store.empty()) requireStoreFor(options.store);
+  const ExitCode code = perform(options, installation, console, std::move(began), jobs, selection.failed, runOptions,
+                                phone.make, signals);
+  return options.store.empty() ? code : importedInto(options.store, record, code, console);
 }
 
 namespace {

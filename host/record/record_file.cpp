@@ -301,6 +301,11 @@ StoredRecord readRecord(const std::filesystem::path& file, const std::function<v
     throw CommandError(ExitCode::kCannotRead, "the record '" + file.string() + "' cannot be read: " +
                                                   (stream ? "it is a directory" : std::strerror(errno)));
   }
+  return readRecord(stream, file, onProgress);
+}
+
+StoredRecord readRecord(std::istream& stream, const std::filesystem::path& file,
+                        const std::function<void(std::uint64_t bytes)>& onProgress) {
   StoredRecord stored;
   FrameOrder frames;
   std::string line;
@@ -345,7 +350,10 @@ bool isRecord(const std::filesystem::path& file) {
 
 RecordedRun runIn(const std::filesystem::path& file) {
   refuseFolderAsRecord(file);
-  StoredRecord stored = readRecord(file);
+  return recordedRunOf(readRecord(file));
+}
+
+RecordedRun recordedRunOf(StoredRecord stored) {
   RecordedRun run;
   RecordBuilder builder;
   std::vector<RecordedStream> streams;

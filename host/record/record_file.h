@@ -8,6 +8,7 @@
 #include <cstdint>
 #include <filesystem>
 #include <functional>
+#include <istream>
 #include <optional>
 #include <string>
 #include <vector>
@@ -81,6 +82,10 @@ class RecordDefect : public CommandError {
 StoredRecord readRecord(const std::filesystem::path& file,
                         const std::function<void(std::uint64_t bytes)>& onProgress = nullptr);
 
+// The same for what was read of `file` already.
+StoredRecord readRecord(std::istream& content, const std::filesystem::path& file,
+                        const std::function<void(std::uint64_t bytes)>& onProgress = nullptr);
+
 // True if the first line of the file is that of a record. False for a file that cannot be read.
 bool isRecord(const std::filesystem::path& file);
 
@@ -112,6 +117,9 @@ struct RecordedRun {
   bool isLastOpen = false;                             // the diagnostic of the last record did not end
   std::vector<std::vector<RecordedStream>> streams{};  // those of each of the records
 };
+
+// The run that the events tell, whose first is a RunStarted.
+RecordedRun recordedRunOf(StoredRecord stored);
 
 // The run in a record, which may be incomplete. Throws like readRecord() and, for a folder, refuseFolderAsRecord().
 RecordedRun runIn(const std::filesystem::path& file);

@@ -226,4 +226,11 @@ std::vector<std::string> problemsOf(const std::vector<RunEvent>& events) {
   return std::move(verifier.problems);
 }
 
+std::vector<std::string> problemsOfRecord(const StoredRecord& stored) {
+  std::vector<std::string> problems = problemsOf(stored.events);
+  const bool isComplete = std::holds_alternative<RunEnded>(stored.events.back());
+  if (isComplete && stored.cutOff) problems.emplace_back("an incomplete line follows the end of the run");
+  return problems;
+}
+
 }  // namespace quazor

@@ -2,6 +2,7 @@
 #pragma once
 
 #include "host/model/run_event.h"
+#include "host/record/record_file.h"
 
 #include <string>
 #include <vector>
@@ -12,5 +13,7 @@ namespace quazor {
 // quazor follows from errors, results and limits, the events are in a valid order, and a finished run includes all
 // selected diagnostics. A run that was cut off is not a problem.
 std::vector<std::string> problemsOf(const std::vector<RunEvent>& events);
+// The same of a whole file, with what follows the end of the run.
+std::vector<std::string> problemsOfRecord(const StoredRecord& stored);
 
 }  // namespace quazor

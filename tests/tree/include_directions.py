@@ -88,10 +88,13 @@ for name, below in {
     "record": ["error", "limits", "model", "plugin", "system", "text"],
     "report": ["device", "error", "limits", "model", "plugin", "record", "system", "text"],
     "report/page": ["limits", "model", "plugin", "record", "report", "text"],
+    "statistics": [],
+    "store": ["error", "limits", "model", "plugin", "record", "statistics", "system", "text"],
     "run": ["device", "error", "limits", "model", "plugin", "record", "report", "system", "text"],
-    "cli": ["device", "error", "limits", "plugin", "report", "run", "system", "text"],
-    "command": ["cli", "device", "error", "limits", "model", "plugin", "record", "report", "report/page", "run",
-                "system", "text"],
+    "cli": ["device", "error", "limits", "plugin", "report", "run", "store", "system", "text"],
+    "command/records": ["cli", "error", "model", "record", "report", "statistics", "store", "system", "text"],
+    "command": ["cli", "command/records", "device", "error", "limits", "model", "plugin", "record", "report",
+                "report/page", "run", "store", "system", "text"],
 }.items():
     ALLOWED["host/" + name] = [*CONTRACT, "base/json", "base/text", *("host/" + folder for folder in below)]
 ALLOWED["host/device"] += BACKENDS
