@@ -30,6 +30,23 @@ int HostileKernel::tell(media_v2_topology& asked) const {
   return result == 0 ? copyTo(asked.ptr_links, asked.num_links, topology->links) : result;
 }
 
+// As the kernel does it: only MEDIA_LNK_FL_ENABLED changes, and only of links that may change.
+int HostileKernel::setUp(const media_link_desc& wanted) {
+  const auto isAt = [this](std::uint32_t id, const media_pad_desc& place) {
+    const auto pad = std::ranges::find_if(topology->pads, [id](const media_v2_pad& one) { return one.id == id; });
+    return pad != topology->pads.end() && pad->entity_id == place.entity && pad->index == place.index;
+  };
+  for (media_v2_link& link : topology->links) {
+    if (!isAt(link.source_id, wanted.source) || !isAt(link.sink_id, wanted.sink)) continue;
+    const std::uint32_t enabled = MEDIA_LNK_FL_ENABLED;
+    const bool isFixed = (link.flags & MEDIA_LNK_FL_IMMUTABLE) != 0;
+    if ((link.flags & ~enabled) != (wanted.flags & ~enabled) || (isFixed && link.flags != wanted.flags)) return EINVAL;
+    link.flags = wanted.flags;
+    return 0;
+  }
+  return EINVAL;
+}
+
 void HostileKernel::damageBytes(void* at, std::size_t size) {
   if (size == 0) return;
   auto* const bytes = static_cast<std::uint8_t*>(at);
@@ -81,11 +98,15 @@ void HostileKernel::damage(unsigned long request, void* argument) {
   }
 }
 
+int HostileKernel::answer(int descriptor, unsigned long request, void* argument) {
+  if (topology && request == MEDIA_IOC_G_TOPOLOGY) return -tell(*static_cast<media_v2_topology*>(argument));
+  if (topology && request == MEDIA_IOC_SETUP_LINK) return -setUp(*static_cast<const media_link_desc*>(argument));
+  return FakeV4l2Api::ioctl(descriptor, request, argument);
+}
+
 int HostileKernel::ioctl(int descriptor, unsigned long request, void* argument) {
   ++calls_;
-  const bool tells = topology && request == MEDIA_IOC_G_TOPOLOGY;
-  const int result =
-      tells ? -tell(*static_cast<media_v2_topology*>(argument)) : FakeV4l2Api::ioctl(descriptor, request, argument);
+  const int result = answer(descriptor, request, argument);
   const std::uint8_t choice = input_.byte();
   if (choice < 0xC0) return result;
   if (choice < 0xD0) return -kNumbers.at(choice & 0xF);

@@ -20,13 +20,15 @@ class HostileKernel final : public FakeV4l2Api {
 
   int ioctl(int descriptor, unsigned long request, void* argument) override;
 
-  // If set, media controllers tell it instead of their own.
+  // If set, media controllers tell it instead of their own, and set up its links.
   std::optional<MediaTopology> topology;
   // The number of calls so far: a driver that never ends a list must not keep the program busy.
   std::size_t calls() const { return calls_; }
 
  private:
   int tell(media_v2_topology& asked) const;
+  int setUp(const media_link_desc& wanted);
+  int answer(int descriptor, unsigned long request, void* argument);
   void damage(unsigned long request, void* argument);
   void damageBytes(void* at, std::size_t size);
 

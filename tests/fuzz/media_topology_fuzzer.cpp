@@ -29,8 +29,9 @@ std::uint32_t idFrom(ByteInput& input, std::uint32_t first, std::size_t count) {
   return first + static_cast<std::uint32_t>(choice % (count + 1));
 }
 
+constexpr const char* kNames[] = {"Sensor A", "Sensor B", "Converter", "Scaler", "Camera", "Flash", ""};
+
 void name(media_v2_entity& entity, ByteInput& input) {
-  constexpr const char* kNames[] = {"Sensor A", "Sensor B", "Converter", "Scaler", "Camera", "Flash", ""};
   const std::uint8_t choice = input.byte();
   if (choice < 0xF0) {
     std::strcpy(entity.name, kNames[choice % 7]);
@@ -122,6 +123,57 @@ MediaTopology topologyFrom(ByteInput& input) {
   return topology;
 }
 
+// Links and pads that a binding may name, whether the topology has them or not.
+MediaBinding bindingFrom(ByteInput& input, const MediaTopology& topology) {
+  MediaBinding binding;
+  binding.device.model = "Fake ISP";
+  const auto padFrom = [&] { return PadName{kNames[input.byte() % 6], input.byte() % 5U}; };
+  // The place of a pad of the topology, or another one.
+  const auto placeFrom = [&](std::uint32_t id) {
+    const auto pad = std::ranges::find_if(topology.pads, [id](const media_v2_pad& one) { return one.id == id; });
+    if (pad == topology.pads.end()) return padFrom();
+    const auto isOwner = [&](const media_v2_entity& one) { return one.id == pad->entity_id; };
+    const auto owner = std::ranges::find_if(topology.entities, isOwner);
+    if (owner == topology.entities.end()) return padFrom();
+    return PadName{{owner->name, strnlen(owner->name, sizeof owner->name - 1)}, pad->index};
+  };
+  for (std::size_t i = input.byte() % 6; i > 0; --i) {
+    const std::uint8_t choice = input.byte();
+    LinkBinding link{{}, {}, choice % 2 == 0};
+    if (topology.links.empty() || choice >= 0xC0) {
+      link.source = padFrom();
+      link.sink = padFrom();
+    } else {
+      const media_v2_link& known = topology.links.at(input.byte() % topology.links.size());
+      link.source = placeFrom(known.source_id);
+      link.sink = placeFrom(known.sink_id);
+    }
+    binding.links.push_back(std::move(link));
+  }
+  for (std::size_t i = input.byte() % 4; i > 0; --i) {
+    const std::uint8_t choice = input.byte();
+    PadBinding pad{padFrom(), {}, {}, {}};
+    if ((choice & 1) != 0) pad.format = PadFormat{MEDIA_BUS_FMT_SBGGR8_1X8, 640, 480};
+    if ((choice & 2) != 0) pad.crop = FrameArea{0, 0, 320, 240};
+    if ((choice & 4) != 0) pad.interval = FrameInterval{1, 30};
+    binding.pads.push_back(std::move(pad));
+  }
+  for (std::size_t i = input.byte() % 3; i > 0; --i) binding.subdevices.emplace_back(kNames[input.byte() % 7]);
+  return binding;
+}
+
+// A path is set as its binding says, and again if another program has changed it.
+void usePath(HostileKernel& kernel, const FakeBoard& board, const MediaBinding& binding) {
+  MediaDevices devices(board.kernel, kernel.roots());
+  DiagnosticErrorPtr error;
+  const auto pipeline = MediaPipeline::open(devices, binding, "camera", board.camera, &error);
+  require((pipeline == nullptr) == (error != nullptr), "a path that cannot be set has an error, and only that");
+  if (pipeline == nullptr) return;
+  if (kernel.topology && !kernel.topology->links.empty()) kernel.topology->links.pop_back();
+  const bool isPrepared = pipeline->prepare(&error);
+  require(isPrepared == (error == nullptr), "a path that cannot be set again has an error, and only that");
+}
+
 void requireGraph(const MediaGraph& graph) {
   std::set<std::uint32_t> ids;
   for (const MediaEntity& entity : graph.entities()) {
@@ -138,6 +190,11 @@ void requireGraph(const MediaGraph& graph) {
       require(std::ranges::find(owner->pads, place.pad, &MediaPad::index) != owner->pads.end(), "and of their pads");
     }
   }
+}
+
+// The links at the end, of which the last one may have gone, are as they were.
+void requireSame(const std::vector<media_v2_link>& after, const std::vector<media_v2_link>& before) {
+  for (std::size_t i = 0; i < after.size(); ++i) require(after[i].flags == before[i].flags, "each link is set back");
 }
 
 // Which nodes of the probe come to a path, with what a binding needs.
@@ -164,23 +221,18 @@ extern "C" int LLVMFuzzerTestOneInput(const std::uint8_t* data, std::size_t size
   const bool isHostile = input.byte() % 2 == 1;  // otherwise the topology alone is arbitrary
   const auto kernel = std::make_shared<HostileKernel>(isHostile ? input : none);
   const FakeBoard board(kernel);
-  if (input.byte() % 4 != 3) kernel->topology = topologyFrom(input);
+  const std::uint8_t choice = input.byte();
+  if (choice % 4 != 3) kernel->topology = topologyFrom(input);
+  const bool hasOwnPath = choice < 0x80;
+  const MediaTopology told = kernel->topology.value_or(MediaTopology());
+  const MediaBinding binding = hasOwnPath ? *FakeBoard::binding().media : bindingFrom(input, told);
   if (const auto device = MediaDevice::inspect(kernel, kernel->roots(), board.media, nullptr)) {
     requireGraph(device->graph());
   }
   probe(kernel, kernel->roots());
-  {
-    MediaDevices devices(kernel, kernel->roots());
-    DiagnosticErrorPtr error;
-    const auto pipeline = MediaPipeline::open(devices, *FakeBoard::binding().media, "camera", board.camera, &error);
-    require((pipeline == nullptr) == (error != nullptr), "a path that cannot be set has an error, and only that");
-  }
+  usePath(*kernel, board, binding);
   require(kernel->calls() < 1'000'000, "a driver cannot keep the program busy");
-  for (const std::string& path : {board.camera, board.media, board.flash}) {
-    kernel->with(path, [](const FakeNode& node) {
-      require(node.opened == 0, "nothing stays open");
-      return 0;
-    });
-  }
+  require(kernel->isIdle(), "nothing stays open");
+  if (!isHostile) requireSame(kernel->topology.value_or(MediaTopology()).links, told.links);
   return 0;
 }

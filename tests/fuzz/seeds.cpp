@@ -190,14 +190,27 @@ void writeDevices(const fs::path& folder) {
   reports.add("stream", bytes("\0\6\3\1\0\0\0\7\3\5\4\0\4abcd\5"));
   reports.add("one_image", bytes("\1\1\1\0\5\3\1\0\0\0"));
   reports.add("error", bytes("\1\11\1\1\5\3\1\0\0\0\0"));
-  // Answers of drivers that are true, with some bytes of metadata, and some that are not.
+  // Answers of drivers that are true, with some bytes of metadata, and some that are not; a camera with formats of the
+  // binding, and one behind links, both with controls that are given by their numbers.
   const Seeds drivers(folder, "camera_driver");
-  drivers.add("true", bytes("\0\10\0\0\4\2\4\1\377\1\0\0\10\3\7\1"));
+  drivers.add("true", bytes("\0\0\0\10\0\0\0\4\2\4\0\4\1\0\1\0\1\0\0\0\0\3\2\4\1\5"));
   drivers.add("damaged", std::string(100, '\0') + std::string(bytes("\xe0\4\0\3\1\2\3\xc1\xf1\0\0\1\x7f")));
-  // A board of one sensor, and its own.
+  drivers.add("formats", bytes("\0\x80\x80\10\0\0\0\4\2\4\0\4\1\0\0\2\0\7\2\1\1\0\36\0\0\0\1\31\0\x80\x80"));
+  drivers.add("board", bytes("\3\x80\x80\10\0\0\0\4\2\4\0\4\1\0\0\2\0\x0a\x80\1"));
+  // A sensor that is opened, scheduled and sends four reports and an error; a keyboard that is unplugged.
+  const Seeds traffic(folder, "hidraw");
+  const std::string sensor(
+      bytes("\006\0\377\011\044\241\1\025\0\046\377\0\165\010\205\166\011\166\226\027\003\201\2"
+            "\205\253\011\253\225\1\261\2\300"));
+  const std::string steps(bytes("\0\x49\14\0\0\0\0\4abcd\0\0\0\0\0\0\0\0\0\0\0\0\10\5\0\10"));
+  traffic.add("sensor", std::string(bytes("\45\0")) + sensor + std::string(bytes("\6Sensor")) + steps);
+  traffic.add("unplugged", bytes("\15\0\5\1\11\6\241\1\165\10\225\2\201\2\300\0\0\x49\14\3\0\1\0\6\0\5\1\10"));
+  // A board of one sensor, and its own; a topology whose links the binding names.
   const Seeds topologies(folder, "media_topology");
   topologies.add("own", bytes("\1\3"));
   topologies.add("sensor", bytes("\0\0\3\0\0\0\0\1\3\0\2\4\3\1\0\2\1\3\2\4\1\0\0\1\1\1\0\2\0\2\1\0\1\1\2\3"));
+  topologies.add("links",
+                 bytes("\0\x80\3\0\0\0\0\1\3\0\2\4\3\1\0\2\1\3\2\4\1\0\0\1\1\1\0\2\0\2\1\0\1\1\2\3\2\0\0\0\1\1"));
   const Seeds machines(folder, "device_probe");
   machines.add("cameras", bytes("\2\2\1\1\1"));
   machines.add("all", bytes("\25\22\0\0\0\0\0\0\0\0\0\0\0\0\0\3Cam\7\5\1\11\60\241\1\300\2ab"));

@@ -18,7 +18,7 @@ FakeNode webcam(int number) {
   node.formats = {
       {fakeCode('M', 'J', 'P', 'G'), "Motion-JPEG", {{1920, 1080, {{333333, 10000000}}}}},
       {fakeCode('Y', 'U', 'Y', 'V'), "YUYV 4:2:2", {{1280, 720, {{1, 10}}}, {640, 480, {{1, 30}, {1, 15}}}}},
-      {fakeCode('N', 'V', '1', '2'), "Y/UV 4:2:0", {{320, 240, {{1, 30}}}}},
+      {fakeCode('N', 'V', '1', '2'), "Y/UV 4:2:0", {{320, 240, {{1, 30}, {1, 15}}}}},
       {fakeCode('G', 'R', 'E', 'Y'), "8-bit grey", {{1280, 720, {{1, 15}}}}}};
   return node;
 }
@@ -92,6 +92,15 @@ TEST_P(ProbedCamerasTest, OneCameraRunsAsItWasProbed) {
   EXPECT_LT(outcome.measured("SilenceAtEnd"), 40);
   EXPECT_TRUE(experiment.teardown(nullptr));
   EXPECT_TRUE(kernel_->isIdle());
+}
+
+// Camera 1 has format indexes of the binding.
+TEST_P(ProbedCamerasTest, OneCameraRunsAtAnotherRateThanItWasProbedAt) {
+  QZSingleCameraExperiment experiment(probedPlatform());
+  const Outcome outcome = outcomeOf(experiment, Dictionary{{"camera", 1}, {"frameRate", 15.0}, {"duration", 2.99}});
+  ASSERT_NE(outcome.result, nullptr) << outcome.error;
+  EXPECT_NEAR(outcome.measured("FrameRate"), 15, 0.01);
+  EXPECT_TRUE(experiment.teardown(nullptr));
 }
 
 TEST(ProbedBoardTest, ACameraBehindAMediaControllerRunsAsItWasProbed) {

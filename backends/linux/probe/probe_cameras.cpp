@@ -96,7 +96,7 @@ struct ChosenMode {
   const VideoFormat* format = nullptr;
   std::uint32_t width = 0;
   std::uint32_t height = 0;
-  std::optional<FrameInterval> interval;  // the driver's interval for the default rate, if it reports one
+  std::optional<FrameInterval> interval;  // of the default rate, as the driver reports it
   bool hasDefaultRate = false;
 };
 
@@ -222,6 +222,8 @@ class CameraProbe {
       if (path) mode = modeOf(*path);
     } else {
       mode = modeFor(isTaken ? 0 : kPorts.at(cameras_.size()).formatIndex, formats);
+      // An interval in the binding forbids all other rates: it is only for a driver that cannot be asked for a rate.
+      if (mode && details->hasInterval) mode->interval.reset();
     }
     tellUse(node, mode, path, formats, reason);
     if (mode && !mode->hasDefaultRate) {

@@ -176,9 +176,9 @@ TEST_F(ProbeTest, MapsTheFormatIndexesOfTheDiagnosticsThatACameraDoesNotHave) {
   ASSERT_EQ(binding_.cameras.size(), 5U);
   const CameraBinding& back = binding_.cameras[0];
   EXPECT_EQ(back.width * 1000 + back.height, 640360U);
-  EXPECT_THAT(back.formats, ElementsAre(FormatBinding{0, "NV12", 640, 360, FrameInterval{1, 30}},
-                                        FormatBinding{16, "NV12", 640, 360, FrameInterval{1, 30}}))
-      << "the last format has no size at 30, and the first one not this size";
+  EXPECT_THAT(back.formats,
+              ElementsAre(FormatBinding{0, "NV12", 640, 360, {}}, FormatBinding{16, "NV12", 640, 360, {}}))
+      << "the last format has no size at 30, and the first one not this size; the driver can be asked for other rates";
   EXPECT_THAT(told, Contains("    format index 16 of the diagnostics: NV12 of 640x360"));
   EXPECT_EQ(binding_.cameras[1].formats.at(1).index, 14U);
   EXPECT_EQ(binding_.cameras[2].formats.at(1).index, 9U);
@@ -198,7 +198,17 @@ TEST_F(ProbeTest, MapsOnlyToFormatsWhoseCodeCanBeWritten) {
   kernel_->add(0, node);
   probe();
   ASSERT_EQ(binding_.cameras.size(), 1U);
-  EXPECT_THAT(binding_.cameras[0].formats, ElementsAre(FormatBinding{16, "Y16 -BE", 640, 360, FrameInterval{1, 30}}));
+  EXPECT_THAT(binding_.cameras[0].formats, ElementsAre(FormatBinding{16, "Y16 -BE", 640, 360, {}}));
+}
+
+TEST_F(ProbeTest, WritesTheIntervalOfADriverThatCannotBeAskedForARate) {
+  FakeNode node = webcam("fake:0");
+  node.hasIntervals = false;
+  kernel_->add(0, node);
+  probe();
+  ASSERT_EQ(binding_.cameras.size(), 1U);
+  EXPECT_THAT(binding_.cameras[0].formats, ElementsAre(FormatBinding{0, "NV12", 640, 360, FrameInterval{1, 30}},
+                                                       FormatBinding{16, "NV12", 640, 360, FrameInterval{1, 30}}));
 }
 
 TEST_F(ProbeTest, TellsWhyACameraDoesNotFit) {

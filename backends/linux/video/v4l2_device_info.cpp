@@ -121,7 +121,8 @@ std::optional<VideoNodeDetails> detailsOf(const std::shared_ptr<V4l2Api>& kernel
                                           DiagnosticErrorPtr* error) {
   const auto opened = V4l2Device::open(kernel, node.path.string(), error);
   if (opened == nullptr) return std::nullopt;
-  return VideoNodeDetails{opened->formats(), opened->controls(), opened->undescribedControls()};
+  return VideoNodeDetails{opened->formats(), opened->controls(), opened->undescribedControls(),
+                          opened->interval(nullptr).has_value()};
 }
 
 bool matches(const V4l2DeviceInfo& node, const VideoNodeMatch& match) {

@@ -77,6 +77,7 @@ struct VideoNodeDetails {
   std::vector<VideoFormat> formats;
   std::vector<VideoControl> controls;
   std::string undescribedControls;  // V4l2Device::undescribedControls()
+  bool hasInterval = false;         // the driver tells its interval, and then sets it, too
 };
 
 // The directories of the system's devices.
