@@ -113,14 +113,12 @@ std::shared_ptr<V4l2Device> V4l2Device::open(std::shared_ptr<V4l2Api> kernel, co
 std::shared_ptr<V4l2Device> V4l2Device::open(std::shared_ptr<V4l2Api> kernel, const V4l2DeviceInfo& info,
                                              DiagnosticErrorPtr* error) {
   std::shared_ptr<V4l2Device> node = open(std::move(kernel), info.path.string(), error);
-  if (node == nullptr ||
-      (fixedText(node->capability_.driver) == info.driver && fixedText(node->capability_.card) == info.card &&
-       fixedText(node->capability_.bus_info) == info.busInfo)) {
-    return node;
-  }
-  refuseLinux(error, LinuxErrorCode::kDeviceGone, "%@ was replaced by another device before it was opened.",
-              textOf(info));
-  return nullptr;
+  if (node == nullptr) return node;
+  const v4l2_capability& found = node->capability_;
+  const bool isAlike = fixedText(found.driver) == info.driver && fixedText(found.card) == info.card &&
+                       fixedText(found.bus_info) == info.busInfo;
+  const bool isSame = isAlike ? isStillThere(info.identity, textOf(info), error) : refuseReplaced(textOf(info), error);
+  return isSame ? node : nullptr;
 }
 
 std::shared_ptr<V4l2Device> V4l2Device::openSubdevice(std::shared_ptr<V4l2Api> kernel, const std::string& path,

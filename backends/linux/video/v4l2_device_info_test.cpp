@@ -115,6 +115,22 @@ TEST(VideoNodesTest, ANodeThatWasReplacedBeforeItIsOpenedIsRefused) {
   EXPECT_TRUE(kernel->isIdle());
 }
 
+// Twins that were unplugged and plugged in the other way round differ in nothing else.
+TEST(VideoNodesTest, ATwinThatTookTheNumberOfANodeIsRefused) {
+  const Kernel kernel = std::make_shared<FakeV4l2Api>();
+  const std::string path = kernel->add(0, fakeCamera("fake:0"));
+  kernel->add(1, fakeCamera("fake:0"));
+  const std::vector<V4l2DeviceInfo> nodes = videoNodes(kernel, kernel->roots());
+  const std::filesystem::path entries = kernel->roots().sysfs / "class" / "video4linux";
+  std::filesystem::rename(entries / "video0", entries / "unplugged");
+  std::filesystem::rename(entries / "video1", entries / "video0");
+  EXPECT_EQ(outcome([&](auto* error) { return V4l2Device::open(kernel, nodes.at(0), error); }),
+            "9 " + path +
+                " (driver fake, card fake camera, bus fake:0) was replaced by another device before it was "
+                "opened.");
+  EXPECT_TRUE(kernel->isIdle());
+}
+
 TEST(VideoNodesTest, ANodeTellsWhatItIsOrWhyItCannotBeOpened) {
   const Kernel kernel = std::make_shared<FakeV4l2Api>();
   kernel->add(0, fakeCamera("fake:0"));
