@@ -338,6 +338,36 @@ TEST(OpenedVideoNodeTest, AControlThatCannotBeDescribedDoesNotEndTheList) {
   EXPECT_FALSE(node->mayHaveControl(V4L2_CID_BACKLIGHT_COMPENSATION));
 }
 
+// A driver may say that there is no further control where there is one that it cannot describe.
+TEST(OpenedVideoNodeTest, AListThatEndsBeforeANeededControlGoesOn) {
+  const Kernel kernel = std::make_shared<FakeV4l2Api>();
+  FakeNode camera = fakeCamera("fake:0");
+  camera.controls = {{V4L2_CID_BRIGHTNESS, "Brightness"},
+                     {V4L2_CID_CONTRAST, "Contrast"},
+                     {V4L2_CID_GAIN, "Gain"},
+                     {V4L2_CID_EXPOSURE_AUTO, "Auto Exposure", 0, 3, 1, V4L2_CTRL_TYPE_MENU},
+                     {V4L2_CID_PRIVACY, "Privacy"}};
+  camera.controls[1].describeProblem = EINVAL;
+  const std::string path = kernel->add(0, camera);
+  const auto namesOf = [&] {
+    std::string names;
+    const auto node = V4l2Device::open(kernel, path, nullptr);
+    for (const VideoControl& control : node->controls()) names += control.name + " ";
+    return names + "(" + node->undescribedControls() + ")";
+  };
+  EXPECT_EQ(namesOf(), "Brightness Gain Auto Exposure Privacy (after 0x00980900 (EINVAL))");
+  kernel->with(path, [](FakeNode& node) {
+    node.controls[1].describeProblem = 0;
+    return 0;
+  });
+  EXPECT_EQ(namesOf(), "Brightness Contrast Gain Auto Exposure Privacy ()");
+  kernel->with(path, [](FakeNode& node) {
+    node.controls.erase(node.controls.begin() + 3, node.controls.end());
+    return 0;
+  });
+  EXPECT_EQ(namesOf(), "Brightness Contrast Gain ()");
+}
+
 TEST(OpenedVideoNodeTest, AListThatCannotBeReadMayHaveAnyControl) {
   const Kernel kernel = std::make_shared<FakeV4l2Api>();
   FakeNode camera = fakeCamera("fake:0");
