@@ -60,6 +60,8 @@ STEPS = [
     Step("usb_stalled_controls", "controls that stall are told, and never reported as set", usb.usb_stalled_controls,
          boot=3),
     Step("usb_metadata", "a USB camera's metadata belong to its frames, whoever stamps them", usb.usb_metadata, boot=3),
+    Step("usb_compliance", "v4l2-compliance finds in a USB camera only what is the driver's or its own",
+         usb.usb_compliance, boot=3),
     Step("usb_damaged_frames", "damaged and short frames are gaps, or buffers with errors", usb.usb_damaged_frames,
          boot=3),
     Step("usb_late_frames", "late frames, and none, are noticed", usb.usb_late_frames, boot=3),
