@@ -298,7 +298,7 @@ Options optionsOf(const CLI::App& command, const RawOptions& raw) {
   options.seeds = parseWhole("--seeds", raw.seeds, 1, 1'000'000);
   options.memory = memoryOf(raw.memory);
   for (const std::string& text : raw.settings) options.settings.push_back(parseOverride(text));
-  for (const std::string& text : raw.limits) options.limits.push_back(limitOfCommandLine(text));
+  options.limits = limitsOfCommandLine(raw.limits);
   for (const std::string& text : raw.deadlines) options.deadlines.push_back(parseDeadline(text));
   if (!raw.grace.empty()) options.grace = parseGrace(raw.grace);
   if (command.get_option_no_throw("--heartbeat") != nullptr) options.heartbeat = parseHeartbeat(raw.heartbeat);
