@@ -1,5 +1,6 @@
 """Checks of the steps with USB cameras and sensors."""
 
+import itertools
 import json
 import re
 
@@ -58,6 +59,17 @@ def healthy_camera(step, label):
     expect_equal("missing frames", results["MissingFrames"], 0)
 
 
+def recorded_frames(step, label):
+    """The number of each frame in the record, and its time of capture from the first one's, in nanoseconds."""
+    numbers, times = [], []
+    for line in step.text(f"{label}.record").splitlines():
+        event = json.loads(line)
+        if event["event"] == "frames":
+            numbers += itertools.accumulate(event["columns"]["number"])
+            times += itertools.accumulate(event["columns"]["captured"])
+    return [(number, time - times[0]) for number, time in zip(numbers, times)]
+
+
 def healthy_again(step):
     healthy_camera(step, "next")
     activity(step, "next_camera")
@@ -70,6 +82,10 @@ def usb_camera(step):
     buffers = [buffer for buffer in trace.dequeued if buffer.minor == int(minors[BUSES[0]])]
     expect_equal("the frames", results_of(step, "single")["Frames"], len(buffers))
     expect_equal("the missing numbers", results_of(step, "single")["Errors.SequenceGapCount"], gaps_in(buffers))
+    # The record has each frame's number and, to the microsecond that drivers tell, its time of capture.
+    times = [buffer.timestamp // 1000 for buffer in buffers]
+    expect_equal("the recorded frames", recorded_frames(step, "single"),
+                 [(buffer.sequence, (time - times[0]) * 1000) for buffer, time in zip(buffers, times)])
     (function,) = activity(step, "camera")[0]["functions"]
     expect_equal("the number of streams", function["streams"], 1)
     expect(0 <= function["frames"] - len(buffers) <= 1, f"{function['frames']} frames were sent, {len(buffers)} came")
