@@ -145,6 +145,17 @@ class LimitsTest(CommandLineTest):
         done = quazor("analyze", record, "--plugin", WORKING, "--limit", f"{other} < {self.name}")
         self.assertEqual(done.stderr, "")
 
+    def test_a_limit_on_what_was_not_reached_leaves_nothing_unknown(self):
+        back, front = "CameraSyncDiagnostic.Back", "CameraSyncDiagnostic.Front"
+        done = quazor("run", back, front, "--stop-on", "fail", "--limit", f"{back}:BackTele.Total < 5", "--limit",
+                      f"{front}:Front.Total > 0", "--limit", "*.Total > 0", "--format", "ocp")
+        self.assertEqual(done.returncode, 1, done.stderr)
+        artifacts = [json.loads(line).get("testRunArtifact", {}) for line in done.stdout.splitlines()]
+        self.assertEqual([(one["testRunEnd"]["status"], one["testRunEnd"]["result"]) for one in artifacts if "testRunEnd" in one],
+                         [("COMPLETE", "FAIL"), ("SKIP", "NOT_APPLICABLE")])
+        self.assertIn("BackTele.Total-limit-fail", done.stdout)
+        self.assertNotIn("UNKNOWN", done.stdout)
+
     def test_a_limit_that_is_given_twice_is_refused(self):
         done = self.run_limited("--limit", f"{self.name} >= 1", "--limit", f"{self.name}>=1.0")
         self.assertEqual(done.returncode, 64, done.stdout)

@@ -36,6 +36,8 @@ STEPS = [
     Step("unbind", "the driver is unbound in mid-stream, and bound again", cameras.unbind),
     Step("selftest_cameras", "the self-test finds faults that are added to a driver's calls",
          cameras.selftest_cameras),
+    Step("single_camera_faults", "one camera whose clock or numbers run out; calls of its driver that are refused",
+         cameras.single_camera_faults),
     Step("two_users", "a second user of a camera is refused; the first goes on", cameras.two_users),
     Step("nothing", "a machine without devices: a clear error each", host.nothing, boot=2),
     Step("simulated_phone", "the simulated phone passes on this kernel", host.simulated_phone, boot=2),
