@@ -73,9 +73,9 @@ function(quazor_configure target)
 endfunction()
 
 # Parsing the most common headers takes a third of a build, so they are precompiled: the first target of a kind owns the
-# result and the others reuse it.
+# result and the others reuse it. Not in a build for fuzzers only, where libraries and plug-ins have different options.
 function(quazor_precompile target kind)
-  if(NOT QUAZOR_UNITY)
+  if(NOT QUAZOR_UNITY OR (QUAZOR_FUZZERS AND NOT QUAZOR_TESTS))
     return()
   endif()
   get_property(owner GLOBAL PROPERTY QUAZOR_HEADERS_OWNER_${kind})

@@ -154,6 +154,7 @@ def text_end(records, of_experiments, interrupted, run, never_began):
     if any(outcome_of(one) == "fail" and (one["attempt"] or 1) > 1 for one in last_attempts(records)) and not run.get("acceptFlaky"):
         yield "A failure after an error counts as an error, unless --accept-flaky is given."
     if not of_experiments:
+        yield from unlimited_line(records)
         yield from failure_lines(records)
     if interrupted is None and run_verdict(records, run.get("acceptFlaky")) == "skip":
         yield "What was skipped makes the exit code 2, unless --allow-skips is given."
@@ -161,6 +162,20 @@ def text_end(records, of_experiments, interrupted, run, never_began):
         running = report_readers.printable(interrupted) or f"no {'experiment' if of_experiments else 'diagnostic'}"
         end = "The recorded run did not come to its end: it stopped while" if "analyzed" in run else "Interrupted while"
         yield f"{end} {running} was running."
+
+
+def unlimited_line(records):
+    """The sentence about diagnostics that pass whatever is measured."""
+    names = []
+    for record in records:
+        rows = report_limits.rows_of(record, lambda label, *_: label)
+        if record["verdict"] == "pass" and rows and all(one.verdict == "none" for one in rows):
+            names.append(report_readers.printable(record["name"]))
+    names = list(dict.fromkeys(names))
+    if names:
+        more = f" and {len(names) - 3} more" if len(names) > 3 else ""
+        yield (f"No result of {', '.join(names[:3])}{more} has a limit, so {'it passes' if len(names) == 1 else 'they pass'} "
+               "whatever is measured. Add limits: --limit 'RESULT >= NUMBER', or --profile.")
 
 
 def with_interrupted(records, interrupted, run):

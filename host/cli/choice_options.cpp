@@ -47,7 +47,7 @@ void addChoiceOptions(CLI::App& command, ChoiceTexts& texts, const std::string& 
                   "Stop after the first error (error), or after the first failure or error (fail); the remaining " +
                       what + " are skipped")
       ->type_name("fail|error")
-      ->check(CLI::IsMember({"fail", "error"}));
+      ->check(CLI::IsMember({"fail", "error"}).description(""));
   command
       .add_option("--settle", texts.settle,
                   "Wait this long between two " + what +

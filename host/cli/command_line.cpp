@@ -118,7 +118,7 @@ void addOutput(CLI::App& command, RawOptions& raw) {
 void addReportOptions(CLI::App& command, RawOptions& raw, const std::vector<std::string>& formats) {
   command.add_option("--format", raw.format, "Report format: " + listText(formats))
       ->type_name("FORMAT")
-      ->check(CLI::IsMember(formats));
+      ->check(CLI::IsMember(formats).description(""));
   if (formats.size() <= 2) return addOutput(command, raw);
   addRepeatable(command, "--output", raw.outputs,
                 "Write the report to this file. FORMAT:FILE writes an additional report; repeatable", "[FORMAT:]FILE");
@@ -191,7 +191,7 @@ void addLogOptions(CLI::App& command, RawOptions& raw) {
                   "Print log lines up to this level (error, default, debug) to standard error and include them in "
                   "reports. Without this option, errors are printed and reports include default")
       ->type_name("LEVEL")
-      ->check(CLI::IsMember({"error", "default", "debug"}));
+      ->check(CLI::IsMember({"error", "default", "debug"}).description(""));
   addLogLimit(command, raw.logLimit);
   command.add_flag("--system-log", raw.systemLog,
                    "Also send log lines to the systemd journal, or to syslog if there is no journal");
@@ -294,7 +294,7 @@ Options optionsOf(const CLI::App& command, const RawOptions& raw) {
   options.seeds = parseWhole("--seeds", raw.seeds, 1, 1'000'000);
   options.memory = memoryOf(raw.memory);
   for (const std::string& text : raw.settings) options.settings.push_back(parseOverride(text));
-  for (const std::string& text : raw.limits) options.limits.push_back(limitOfCommandLine(text));
+  options.limits = limitsOfCommandLine(raw.limits);
   for (const std::string& text : raw.deadlines) options.deadlines.push_back(parseDeadline(text));
   if (!raw.grace.empty()) options.grace = parseGrace(raw.grace);
   if (command.get_option_no_throw("--heartbeat") != nullptr) options.heartbeat = parseHeartbeat(raw.heartbeat);
@@ -341,7 +341,7 @@ void declareRunningCommands(CLI::App& app, RawOptions& raw) {
                  "with the same settings, seed and tags. After --repeat or --attempts, the seed is that of the first "
                  "entry that did not pass")
       ->type_name("failed")
-      ->check(CLI::IsMember({"failed"}));
+      ->check(CLI::IsMember({"failed"}).description(""));
   run.add_option("--of", raw.of, "The record that --only refers to")->type_name("RECORD");
   addRunOptions(run, raw, "diagnostics");
   addStore(run, raw.store);
@@ -406,14 +406,14 @@ void declareOtherCommands(CLI::App& app, RawOptions& raw) {
   phone.add_option("WHAT", raw.what, "list: the simulated phones that --phone accepts; probe: this machine's devices")
       ->type_name("list|probe")
       ->required()
-      ->check(CLI::IsMember({"list", "probe"}));
+      ->check(CLI::IsMember({"list", "probe"}).description(""));
   phone.add_option("PHONE", raw.names, "list: a phone's name, or a pattern (*, ?, [...]) for several")->type_name("");
   addReportOptions(phone, raw, {"text", "json"});
   CLI::App& completion = *app.add_subcommand("completion", "Print the completion script for bash or zsh");
   completion.add_option("SHELL", raw.names, "bash or zsh")
       ->type_name("")
       ->required()
-      ->check(CLI::IsMember({"bash", "zsh"}));
+      ->check(CLI::IsMember({"bash", "zsh"}).description(""));
   CLI::App& project = *app.add_subcommand("new", "Make the project of a plug-in, with a diagnostic, phones and a test");
   project.add_option("FOLDER", raw.names, "Where to make it; its last part is the plug-in's name")
       ->type_name("")

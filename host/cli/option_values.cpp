@@ -6,12 +6,14 @@
 #include "contract/message_format.h"
 #include "host/error/exit_code.h"
 
+#include <algorithm>
 #include <charconv>
 #include <cstddef>
 #include <cstdlib>
 #include <sstream>
 #include <string_view>
 #include <system_error>
+#include <utility>
 
 namespace quazor {
 
@@ -99,14 +101,23 @@ std::optional<LogLevel> logLevelOf(const std::string& text) {
   return std::nullopt;
 }
 
-UserLimit limitOfCommandLine(const std::string& text) {
-  try {
-    UserLimit limit = parseUserLimit(text);
-    limit.source = "command line";
-    return limit;
-  } catch (const InputError& problem) {
-    throw CommandError(ExitCode::kUsage, "--limit '" + text + "': " + problem.what());
+std::vector<UserLimit> limitsOfCommandLine(const std::vector<std::string>& texts) {
+  std::vector<UserLimit> limits;
+  for (const std::string& text : texts) {
+    try {
+      UserLimit limit = parseUserLimit(text);
+      limit.source = "command line";
+      const auto same = std::find(limits.begin(), limits.end(), limit);
+      if (same != limits.end()) {
+        const std::string& first = texts[static_cast<std::size_t>(same - limits.begin())];
+        throw InputError("this limit is given twice, the first time as '" + first + "'");
+      }
+      limits.push_back(std::move(limit));
+    } catch (const InputError& problem) {
+      throw CommandError(ExitCode::kUsage, "--limit '" + text + "': " + problem.what());
+    }
   }
+  return limits;
 }
 
 OrderedMap<std::string> tagsOf(const std::vector<std::string>& texts, bool withEnvironment) {

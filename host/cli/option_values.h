@@ -33,8 +33,8 @@ TraceSetting traceOf(const std::string& text);
 // The level of that name; nothing if there is none.
 std::optional<LogLevel> logLevelOf(const std::string& text);
 
-// The limit of `--limit TEXT`. Throws a CommandError (kUsage) if the text is not a limit.
-UserLimit limitOfCommandLine(const std::string& text);
+// The limits of `--limit TEXT`. Throws a CommandError (kUsage) if a text is not a limit, or the same one as another.
+std::vector<UserLimit> limitsOfCommandLine(const std::vector<std::string>& texts);
 
 // The tags of the environment and of `--tag KEY=VALUE`, which replace those of the environment. Throws a CommandError
 // (kUsage) for a text without that form, with an empty key or value, a key twice in one source, control characters,

@@ -13,9 +13,18 @@
 namespace quazor {
 namespace {
 
-TEST(LimitOfCommandLine, NamesItsSourceAndRefusesOtherTexts) {
-  EXPECT_EQ(limitOfCommandLine("A > 1").source, "command line");
-  EXPECT_EQ(refusalOf(ExitCode::kUsage, [] { return limitOfCommandLine("A >"); }),
+TEST(LimitsOfCommandLine, RefusesOneThatIsGivenTwice) {
+  EXPECT_EQ(limitsOfCommandLine({"A > 1", "A > 2", "D:A > 1"}).size(), 3U);
+  EXPECT_EQ(refusalOf(ExitCode::kUsage,
+                      [] {
+                        return limitsOfCommandLine({"A > 1", "A < 2", "A>1.0"});
+                      }),
+            "--limit 'A>1.0': this limit is given twice, the first time as 'A > 1'");
+}
+
+TEST(LimitsOfCommandLine, NamesTheirSourceAndRefusesOtherTexts) {
+  EXPECT_EQ(limitsOfCommandLine({"A > 1"}).front().source, "command line");
+  EXPECT_EQ(refusalOf(ExitCode::kUsage, [] { return limitsOfCommandLine({"A >"}); }),
             "--limit 'A >': a number or the name of a result is missing");
 }
 

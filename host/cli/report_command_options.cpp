@@ -13,7 +13,7 @@ void addReportCommandOptions(CLI::App& command, ReportCommandTexts& texts) {
                   "html: one page for people, which needs no network; trace: a time line of diagnostics, stages, log "
                   "lines and frames, in the Trace Event Format that Perfetto, speedscope and Chrome open. Default html")
       ->type_name("FORMAT")
-      ->check(CLI::IsMember({"html", "trace"}));
+      ->check(CLI::IsMember({"html", "trace"}).description(""));
   command.add_flag("--compare", texts.compare, "Make a page of what differs between two records");
   command.add_flag("--no-frames", texts.noFrames, "Leave the frames out of the page");
   command.add_option("--from", texts.from, "Leave out what ends before this time; 0 is the beginning of the run")

@@ -3,6 +3,9 @@
 import csv
 import json
 import os
+import pathlib
+import shlex
+import shutil
 import unittest
 from xml.etree import ElementTree
 
@@ -94,6 +97,34 @@ class ForeignRecordTest(RecordTest):
                 self.assert_refused(quazor("analyze", self.record, *arguments), 66,
                                     f"the record names the plug-in '{WORKING}', which is not an installed one", "--plugin")
         self.assertEqual(analyze(self.record).returncode, 0)
+
+    def test_plug_ins_that_were_moved_are_told_with_the_options_that_load_them(self):
+        self.recorded("--set", "measured=90", "--set", "minimum=90")
+        there, moved = pathlib.Path(WORKING), self.directory / "now here" / "working_plugin.so"
+        moved.parent.mkdir()
+        shutil.copy(there, moved)
+
+        def analyze_named(*plugins):
+            def name(events):
+                events[0]["plugins"] = [str(one) for one in plugins]
+            return quazor("analyze", self.changed(name))
+
+        gone = self.directory / "gone" / "working_plugin.so"
+        self.assert_refused(analyze_named(gone), 66, f"the record names the plug-in '{gone}', which is no longer there; say where "
+                            "it is now: --plugin FILE\n")
+        self.assertEqual(quazor("analyze", self.directory / "changed.jsonl", "--plugin", moved).returncode, 0)
+        refused = analyze_named(moved, gone)
+        self.assert_refused(refused, 66, f"to load it, name it: --plugin '{moved}' --plugin FILE\n")
+        installed = self.directory / "old" / "camera_sensor_diagnostics.so"
+        refused = analyze_named(installed)
+        self.assert_refused(refused, 66, f"the record names the plug-in '{installed}', which is no longer there")
+        option, new = shlex.split(refused.stderr)[-2:]
+        self.assertEqual(option, "--plugin")
+        self.installed()
+        self.assertEqual(new, events_in(self.record)[0]["plugins"][0])
+        refused = analyze_named(installed)
+        again = quazor("analyze", self.directory / "changed.jsonl", option, new)
+        self.assertEqual(again.returncode, 0, again.stderr)
 
     def test_a_rerun_of_a_given_record_loads_none_either(self):
         self.recorded(*self.failing, code=1)

@@ -27,6 +27,13 @@ class HelpTest(CommandLineTest):
         for code in ("0 ", "1 ", "2 ", "64", "66", "70", "73", "130"):
             self.assertIn("\n  " + code, result.stdout)
 
+    def test_choices_are_named_once(self):
+        for command in ("list", "run", "analyze", "report", "phone", "completion"):
+            shown = quazor(command, "--help").stdout
+            self.assertNotRegex(shown, r":\{", command)
+        self.assertRegex(quazor("list", "--help").stdout, r"--format FORMAT +Report format: text, json\n")
+        self.assert_refused(quazor("list", "--format", "pdf"), 64, "pdf", "text", "json")
+
     def test_version_names_the_contract(self):
         result = quazor("--version")
         self.assertEqual(result.returncode, 0)

@@ -119,6 +119,7 @@ std::string strictText(const PhoneDetection& one) {
 
 std::string_view expectationText(const PhoneDetection& one) {
   if (one.kind != PhoneKind::kFaulty) return "passed";
+  if (one.saysNothing && !one.isExpected && one.byDefault.found > 0) return "nothing said";
   return one.isExpected ? "detected" : "not detected";
 }
 
@@ -279,6 +280,7 @@ Json detectionsJson(const std::vector<PhoneDetection>& phones) {
                     {"title", one.title},
                     {"kind", nameOf(one.kind)},
                     {"expectsDetection", one.isExpected},
+                    {"saysNothing", one.saysNothing},
                     {"default", detectionJson(one.byDefault)},
                     {"strict", one.byStrict ? detectionJson(*one.byStrict) : Json()}});
   }

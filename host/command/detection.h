@@ -38,6 +38,7 @@ struct PhoneDetection {
   bool isExpected = false;              // its scenario expects that a run does not pass
   Detection byDefault{};                // with the default profile
   std::optional<Detection> byStrict{};  // with the profile strict; nothing if it is not installed
+  bool saysNothing = false;             // its own file expects nothing; what it expects is inherited
 };
 
 // What the limits of one profile find on all phones.

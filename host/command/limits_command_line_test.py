@@ -122,9 +122,44 @@ class LimitsTest(CommandLineTest):
     def test_an_analysis_keeps_the_limits_on_other_results(self):
         record = self.directory / "record.jsonl"
         self.run_limited("--limit", f"{self.name} < {self.value}", "--record", record, "--replace")
-        path = self.profile({"Fake.*": {"limits": [{"limit": f"{self.name} >= 0", "severity": "warn"}]}})
+        path = self.profile({"Fake.*": {"limits": [{"limit": "* >= 0", "severity": "warn"}]}})
         done = quazor("analyze", record, "--plugin", WORKING, "--parameters", path)
-        self.assertEqual(done.returncode, 1, done.stdout + done.stderr)
+        self.assertEqual((done.returncode, done.stderr), (1, ""), done.stdout)
+
+    def test_an_analysis_tells_the_limits_of_the_record_that_others_replace(self):
+        """Those on the same results, in whatever words; a relation stays unless its left result is the same."""
+        record = self.directory / "record.jsonl"
+        other = next(one["name"] for one in self.results_of()[2] if one["name"] != self.name)
+        self.run_limited("--limit", f"Fake.One:{self.name} < {self.value}", "--limit", f"{other} < {self.name}", "--record",
+                         record, "--replace")
+        profile = self.profile({"Fake.*": {"limits": [{"limit": f"{self.name} >= 0"}]}})
+        for given, new in ((("--limit", f"{self.name} >= 0"), f"{self.name} >= 0' (command line)"),
+                           (("--parameters", profile), f"Fake.*:{self.name} >= 0' (profile profile.json)")):
+            done = quazor("analyze", record, "--plugin", WORKING, "--format", "json", *given)
+            self.assertEqual(done.stderr, f"quazor: the limit 'Fake.One:{self.name} < {self.value}' of the record is replaced "
+                                          f"by '{new}\n")
+            limits = [one["limit"] for result in json.loads(done.stdout)["diagnostics"][0]["measuredResults"]
+                      for one in result["userLimits"]]
+            self.assertEqual(sorted(limits), sorted([new.split("'")[0], f"{other} < {self.name}"]))
+        # The same one is not told.
+        done = quazor("analyze", record, "--plugin", WORKING, "--limit", f"{other} < {self.name}")
+        self.assertEqual(done.stderr, "")
+
+    def test_a_limit_on_what_was_not_reached_leaves_nothing_unknown(self):
+        back, front = "CameraSyncDiagnostic.Back", "CameraSyncDiagnostic.Front"
+        done = quazor("run", back, front, "--stop-on", "fail", "--limit", f"{back}:BackTele.Total < 5", "--limit",
+                      f"{front}:Front.Total > 0", "--limit", "*.Total > 0", "--format", "ocp")
+        self.assertEqual(done.returncode, 1, done.stderr)
+        artifacts = [json.loads(line).get("testRunArtifact", {}) for line in done.stdout.splitlines()]
+        self.assertEqual([(one["testRunEnd"]["status"], one["testRunEnd"]["result"]) for one in artifacts if "testRunEnd" in one],
+                         [("COMPLETE", "FAIL"), ("SKIP", "NOT_APPLICABLE")])
+        self.assertIn("BackTele.Total-limit-fail", done.stdout)
+        self.assertNotIn("UNKNOWN", done.stdout)
+
+    def test_a_limit_that_is_given_twice_is_refused(self):
+        done = self.run_limited("--limit", f"{self.name} >= 1", "--limit", f"{self.name}>=1.0")
+        self.assertEqual(done.returncode, 64, done.stdout)
+        self.assertIn("this limit is given twice", done.stderr)
 
     def test_a_limit_on_what_ended_in_an_error_or_of_a_profile_on_what_was_skipped_is_not_missed(self):
         """Neither in the run nor in an analysis of its record, in which these diagnostics have no result."""

@@ -31,13 +31,23 @@ void writeTimeline(const Options& options, Console& console) {
   const std::filesystem::path& file = options.records.front();
   refuseFolderAsRecord(file);
   const StoredRecord record = readRecord(file);
+  const TimelinePart& part = options.ofRecords.part;
+  Timeline timeline(part);
+  for (const RunEvent& event : record.events) timeline.onEvent(event);
   try {
-    writeOutput(options.report, console, timelineText(record.events, options.ofRecords.part));
+    writeOutput(options.report, console, timeline.text());
   } catch (const TimelineTooLarge& refusal) {
     throw CommandError(ExitCode::kUsage,
                        formatMessage("%@: %@, which few viewers open; --from SECONDS and --to SECONDS "
                                      "choose a part of it",
                                      file.string(), refusal.what()));
+  }
+  if (timeline.isEmpty() && !part.isEverything()) {
+    const std::chrono::duration<double> end = timeline.end();
+    console.err << formatMessage(
+        "quazor: %@: nothing happens in the part that --from and --to choose; the time line "
+        "goes from 0 to %@ s\n",
+        printable(file.string()), end.count());
   }
   if (!std::holds_alternative<RunEnded>(record.events.back())) tellThatTheRunDidNotEnd(file, "time line", console);
 }

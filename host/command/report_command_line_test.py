@@ -93,6 +93,20 @@ class TimelineTest(RecordTest):
         self.assertGreater(len(times), 25)
         self.assertTrue(all(4e6 <= time <= 5e6 for time in times))
 
+    def test_a_part_that_has_nothing_is_told_with_the_length_of_the_run(self):
+        self.run_diagnostics()
+        everything = self.report()
+        end = max(event["ts"] + event["dur"] for event in json.loads(everything.stdout)["traceEvents"] if event["ph"] == "X")
+        self.assertEqual(everything.stderr, "")
+        for part in (("--from", "1000"), ("--from", "1000", "--to", "2000")):
+            result = self.report(*part)
+            self.assertEqual([event["name"] for event in json.loads(result.stdout)["traceEvents"] if event["ph"] != "M"], [])
+            told = re.fullmatch(r"quazor: .*run\.jsonl: nothing happens in the part that --from and --to choose; the time line "
+                                r"goes from 0 to ([0-9.]+) s\n", result.stderr)
+            self.assertTrue(told, result.stderr)
+            self.assertAlmostEqual(float(told[1]), end / 1e6, places=5)
+        self.assertEqual(self.report("--from", "1", "--to", "2").stderr, "")
+
     def test_a_record_that_was_cut(self):
         self.run_diagnostics()
         lines = self.record.read_text().splitlines(keepends=True)

@@ -55,15 +55,24 @@ void tellLimitWithoutResult(const UserLimit& limit, EventPipeline& events) {
   events.endDiagnostic();
 }
 
-// Those of the record, but for those on whose results others are given.
-std::vector<UserLimit> limitsOfAnalysis(std::vector<UserLimit> recorded, const std::vector<UserLimit>& given) {
-  std::erase_if(recorded, [&given](const UserLimit& limit) {
-    return std::any_of(given.begin(), given.end(), [&limit](const UserLimit& other) {
-      return other.diagnostic == limit.diagnostic && other.result == limit.result;
+// The given limits, and those of the record that they do not replace. Tells those that they replace.
+std::vector<UserLimit> limitsOfAnalysis(const std::vector<UserLimit>& recorded, const std::vector<UserLimit>& given,
+                                        const std::vector<DiagnosticRecord>& records, std::ostream& err) {
+  std::vector<UserLimit> limits;
+  for (const UserLimit& limit : recorded) {
+    const auto replacing = std::find_if(given.begin(), given.end(), [&limit, &records](const UserLimit& other) {
+      return areOnSameResults(limit, other, records);
     });
-  });
-  recorded.insert(recorded.end(), given.begin(), given.end());
-  return recorded;
+    if (replacing == given.end()) {
+      limits.push_back(limit);
+    } else if (canonicalText(limit) != canonicalText(*replacing)) {
+      err << printable(formatMessage("quazor: the limit '%@' of the record is replaced by '%@' (%@)",
+                                     canonicalText(limit), canonicalText(*replacing), replacing->source))
+          << '\n';
+    }
+  }
+  limits.insert(limits.end(), given.begin(), given.end());
+  return limits;
 }
 
 RunStarted beginningOf(const Options& options, const Installation& installation, const std::vector<Job>& jobs,
@@ -379,7 +388,7 @@ ExitCode analyzeCommand(const Options& given, const Installation& installation, 
   began.tags = run.began.tags;
   for (const auto& [key, value] : options.tags) began.tags.set(key, value);
   began.acceptFlaky = run.began.acceptFlaky;
-  began.limits = limitsOfAnalysis(limitsToAnalyze(run), selection.limits);
+  began.limits = limitsOfAnalysis(limitsToAnalyze(run), selection.limits, run.records, console.err);
   const std::optional<std::string> interruption = interruptionIn(run, analysable);
   if (interruption) {
     for (const PlannedDiagnostic& one : missingOf(run.began, run.records)) began.names.push_back(one.name);

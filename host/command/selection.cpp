@@ -10,6 +10,7 @@
 #include "host/plugin/profile.h"
 #include "host/plugin/profile_check.h"
 #include "host/text/name_pattern.h"
+#include "host/text/shell_word.h"
 #include "host/text/table.h"
 
 #include <algorithm>
@@ -169,6 +170,26 @@ std::vector<Diagnostic> wantedWithWayOut(const std::vector<Diagnostic>& catalogu
   }
 }
 
+namespace {
+
+// The options that load the plug-ins of a record, with the installed one of the same file name for one that is not
+// where it was, or else FILE.
+std::string pluginOptions(const std::vector<std::string>& recorded,
+                          const std::vector<std::filesystem::path>& installed) {
+  std::string options;
+  for (const std::string& name : recorded) {
+    std::error_code ignored;
+    std::string now = std::filesystem::exists(name, ignored) ? shellWord(name) : "FILE";
+    for (const std::filesystem::path& one : installed) {
+      if (now == "FILE" && one.filename() == std::filesystem::path(name).filename()) now = shellWord(one.string());
+    }
+    options += " --plugin " + now;
+  }
+  return options;
+}
+
+}  // namespace
+
 std::vector<std::filesystem::path> recordedPlugins(const std::vector<std::string>& recorded,
                                                    const Installation& installation) {
   const std::vector<std::filesystem::path> installed = installation.allPlugins();
@@ -179,9 +200,12 @@ std::vector<std::filesystem::path> recordedPlugins(const std::vector<std::string
       return std::filesystem::equivalent(one, name, ignored);
     });
     if (found == installed.end()) {
-      throw CommandError(ExitCode::kCannotRead, "the record names the plug-in '" + name +
-                                                    "', which is not an installed one; to load it, name it with "
-                                                    "--plugin");
+      std::error_code ignored;
+      const bool isThere = std::filesystem::exists(name, ignored);
+      throw CommandError(ExitCode::kCannotRead, formatMessage("the record names the plug-in '%@', which is %@:%@", name,
+                                                              isThere ? "not an installed one; to load it, name it"
+                                                                      : "no longer there; say where it is now",
+                                                              pluginOptions(recorded, installed)));
     }
     plugins.push_back(*found);
   }

@@ -52,11 +52,34 @@ struct Comparison {
 // The counts of one diagnostic in the summary table.
 struct Counts {
   std::size_t faulty = 0;
-  std::size_t detected = 0;
+  std::size_t byDefault = 0;  // detected with every seed
+  std::optional<std::size_t> byStrict;
   std::size_t healthy = 0;
   std::size_t falseAlarms = 0;
   std::size_t invalid = 0;
 };
+
+// For each phone whose own file says nothing of a run that did not pass: what to add to the file.
+void printNotSaid(std::ostream& out, const std::vector<SelftestRow>& rows,
+                  const std::vector<SelftestVerdict>& verdicts) {
+  OrderedMap<Json> entries;
+  for (std::size_t i = 0; i < rows.size(); ++i) {
+    if (verdicts[i] != SelftestVerdict::kNotSaid) continue;
+    const SelftestRow& row = rows[i];
+    if (!entries.contains(row.scenario)) entries.set(row.scenario, Json::object());
+    (*entries.find(row.scenario))[row.expected.key] = row.outcome;
+  }
+  for (const auto& [phone, expect] : entries) {
+    printWrapped(out, phone + " does not say what these runs must find. If it is meant to have this fault, add to it:",
+                 "\n  ", "  ");
+    std::string_view before = "    \"expect\": {\n";
+    for (const auto& [key, outcome] : expect.items()) {
+      out << before << "      " << Json(key).dump() << ": " << outcome.dump();
+      before = ",\n";
+    }
+    out << "\n    }\n";
+  }
+}
 
 OrderedMap<Counts> countsOf(const std::vector<SelftestRow>& rows, const std::vector<SelftestVerdict>& verdicts) {
   OrderedMap<Counts> all;
@@ -64,9 +87,13 @@ OrderedMap<Counts> countsOf(const std::vector<SelftestRow>& rows, const std::vec
     const std::string& name = rows[i].expected.name;
     if (!all.contains(name)) all.set(name, {});
     Counts& counts = *all.find(name);
-    const bool healthy = rows[i].expected.mustPass();
-    ++(healthy ? counts.healthy : counts.faulty);
-    if (verdicts[i] == SelftestVerdict::kDetected) ++counts.detected;
+    const SelftestRow& row = rows[i];
+    const bool isFault = row.concernsFault && verdicts[i] != SelftestVerdict::kFalseAlarm;
+    ++(isFault ? counts.faulty : counts.healthy);
+    if (isFault && row.runs > 0 && row.foundByDefault == row.runs) ++counts.byDefault;
+    if (row.foundByStrict) {
+      counts.byStrict = counts.byStrict.value_or(0) + (isFault && *row.foundByStrict == row.runs ? 1 : 0);
+    }
     if (verdicts[i] == SelftestVerdict::kFalseAlarm) ++counts.falseAlarms;
     if (verdicts[i] == SelftestVerdict::kInvalid) ++counts.invalid;
   }
@@ -81,6 +108,7 @@ std::string_view nameOf(SelftestVerdict verdict) {
     case SelftestVerdict::kDetected: return "detected";
     case SelftestVerdict::kMissed: return "MISSED";
     case SelftestVerdict::kFalseAlarm: return "FALSE ALARM";
+    case SelftestVerdict::kNotSaid: return "NOT SAID";
     case SelftestVerdict::kDifferent: return "DIFFERENT";
     case SelftestVerdict::kInvalid: break;
   }
@@ -108,6 +136,20 @@ std::string differenceOf(const ExpectedOutcome& expected, const DiagnosticRecord
   return {};
 }
 
+Json expectationOf(const ExpectedOutcome& expected, const DiagnosticRecord& record) {
+  Json outcome = Json::object();
+  if (expected.experimentOnly) {
+    outcome["experiment"] = expected.name;
+    for (const auto& [name, value] : expected.parameters) outcome["parameters"][name] = value;
+  }
+  outcome["verdict"] = nameOf(record.verdict);
+  if (const std::optional<ExpectedError> error = partsOf(record.error)) {
+    outcome["error"] = {{"domain", error->domain}, {"code", error->code}, {"message", error->message}};
+  }
+  if (record.verdict == Verdict::kFail) outcome["failedResults"] = failedResultsOf(record);
+  return outcome;
+}
+
 std::vector<SelftestVerdict> verdictsOf(const std::vector<SelftestRow>& rows) {
   OrderedMap<std::vector<std::uint64_t>> fired;
   for (const SelftestRow& row : rows) {
@@ -125,7 +167,7 @@ std::vector<SelftestVerdict> verdictsOf(const std::vector<SelftestRow>& rows) {
     } else if (!healthy && row.passes > 0) {
       verdicts.push_back(SelftestVerdict::kMissed);
     } else if (healthy && row.passes < row.runs) {
-      verdicts.push_back(SelftestVerdict::kFalseAlarm);
+      verdicts.push_back(row.isInherited ? SelftestVerdict::kNotSaid : SelftestVerdict::kFalseAlarm);
     } else if (row.asExpected < row.runs) {
       verdicts.push_back(SelftestVerdict::kDifferent);
     } else {
@@ -154,7 +196,9 @@ void printSelftest(std::ostream& out, const SelftestOutcome& outcome) {
     if (allPassed({verdicts[i]})) continue;
     ++differing;
     const SelftestRow& row = rows[i];
-    others.addRow({printable(row.scenario), printable(row.expected.name), row.expected.verdict,
+    const bool isNotSaid = verdicts[i] == SelftestVerdict::kNotSaid;
+    others.addRow({printable(row.scenario), printable(row.expected.name),
+                   isNotSaid ? "nothing; its base: pass" : row.expected.verdict,
                    formatMessage("%@ of %@", row.asExpected, row.runs), std::string(nameOf(verdicts[i]))});
   }
   if (differing > 0) {
@@ -165,12 +209,18 @@ void printSelftest(std::ostream& out, const SelftestOutcome& outcome) {
       out << "  " << printable(row.scenario) << ", " << printable(row.expected.name) << ": "
           << printable(row.difference) << '\n';
     }
+    printNotSaid(out, rows, verdicts);
     out << '\n';
   }
-  Table matrix({Align::kLeft, Align::kRight, Align::kRight, Align::kRight});
-  matrix.addHeader({"Run", "Detected", "False alarms", "Invalid"});
+  Table matrix({Align::kLeft, Align::kRight, Align::kRight, Align::kRight, Align::kRight, Align::kRight, Align::kRight,
+                Align::kRight});
+  matrix.addHeader(
+      {"Run", "Faults", "By default", "Not detected", "By strict", "Not detected", "False alarms", "Invalid"});
   for (const auto& [name, counts] : countsOf(rows, verdicts)) {
-    matrix.addRow({printable(name), formatMessage("%@ of %@", counts.detected, counts.faulty),
+    const std::optional<std::size_t>& strict = counts.byStrict;
+    matrix.addRow({printable(name), std::to_string(counts.faulty), std::to_string(counts.byDefault),
+                   std::to_string(counts.faulty - counts.byDefault), strict ? std::to_string(*strict) : "-",
+                   strict ? std::to_string(counts.faulty - *strict) : "-",
                    formatMessage("%@ of %@", counts.falseAlarms, counts.healthy), std::to_string(counts.invalid)});
   }
   matrix.print(out, "");
@@ -205,6 +255,10 @@ Json selftestDocument(const SelftestOutcome& outcome) {
     json.push_back({{"phone", row.scenario},
                     {"name", row.expected.name},
                     {"expected", row.expected.verdict},
+                    {"inherited", row.isInherited},
+                    {"concernsFault", row.concernsFault},
+                    {"foundByDefault", row.foundByDefault},
+                    {"foundByStrict", row.foundByStrict ? Json(*row.foundByStrict) : Json()},
                     {"runs", row.runs},
                     {"asExpected", row.asExpected},
                     {"outcome", withSmallLetters(nameOf(verdicts[i]))},

@@ -8,6 +8,7 @@
 #include <nlohmann/json.hpp>
 
 #include <cstdint>
+#include <optional>
 #include <ostream>
 #include <string>
 #include <vector>
@@ -23,6 +24,11 @@ struct SelftestRow {
   std::uint64_t passes = 0;                // runs with the verdict pass
   std::string difference;                  // of the first run that did not end as expected
   std::vector<std::uint64_t> faultsFired;  // per fault of the phone, in all runs together
+  bool isInherited = false;                // the phone's own file does not say what is expected
+  bool concernsFault = false;  // the run must not pass, or finds a fault of the phone, or is said to pass despite it
+  std::uint64_t foundByDefault = 0;              // runs that do not pass, with the limits of the profile
+  std::optional<std::uint64_t> foundByStrict{};  // nothing if the profile is not installed
+  nlohmann::ordered_json outcome{};              // of the first run that did not end as expected, as in "expect"
 };
 
 enum class SelftestVerdict {
@@ -30,6 +36,7 @@ enum class SelftestVerdict {
   kDetected,    // the fault was found
   kMissed,      // the phone has a fault, and a run passed
   kFalseAlarm,  // the phone has no fault, and a run did not pass
+  kNotSaid,     // the phone's own file says nothing, its base says that it passes, and a run did not pass
   kDifferent,   // found, but not with the expected outcome
   kInvalid,     // a fault of the phone never fired, so the runs show nothing
 };
@@ -38,6 +45,9 @@ std::string_view nameOf(SelftestVerdict verdict);
 
 // A user-readable difference between the outcome and the expected one; empty if there is none.
 std::string differenceOf(const ExpectedOutcome& expected, const DiagnosticRecord& record);
+
+// The outcome as an entry of "expect" that expects it.
+nlohmann::ordered_json expectationOf(const ExpectedOutcome& expected, const DiagnosticRecord& record);
 
 // The faults of a phone are counted over all of its rows.
 std::vector<SelftestVerdict> verdictsOf(const std::vector<SelftestRow>& rows);

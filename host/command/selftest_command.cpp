@@ -239,9 +239,13 @@ class Selftest {
   bool performPhone(const WantedPhone& wanted, SelftestOutcome& outcome) {
     const ScenarioSummary& summary = wanted.summary;
     PhoneDetection phone{wanted.name, summary.title, kindOf(wanted), !summary.mustPass()};
+    phone.saysNothing = std::none_of(summary.expected.begin(), summary.expected.end(),
+                                     [&wanted](const ExpectedOutcome& one) { return isNamedIn(wanted.file, one); });
     std::vector<SelftestRow> rows;
     for (const ExpectedOutcome& expected : summary.expected) {
-      rows.push_back({wanted.name, expected, 0, 0, 0, {}, {}});
+      SelftestRow& row = rows.emplace_back(SelftestRow{wanted.name, expected, 0, 0, 0, {}, {}});
+      row.isInherited = !isNamedIn(wanted.file, expected);
+      row.concernsFault = !expected.mustPass();
     }
     std::vector<ExpectedOutcome> wantedRuns = summary.expected;
     // Of the other diagnostics the file of a changed phone does not say that they pass, and a real one may lack their
@@ -264,11 +268,17 @@ class Selftest {
               judged.verdict != Verdict::kPass && (isNamed || isNews(phone.kind, wanted, expected, one.judge));
           if (isInterrupted()) return false;
           if (isAlarm) one.alarms.push_back(alarmText(judged));
+          if (isNamed) countFound(rows[i], judged, &one.judge == &default_);
           noteResults(one.judge.measured, judged);
           if (seed == 0) one.records.push_back(std::move(judged));
         }
       }
       for (ProfileRuns& one : profiles) addSeed(one, phone.kind);
+    }
+    if (phone.kind == PhoneKind::kFaulty && summary.mustPass()) {
+      for (SelftestRow& row : rows) {
+        row.concernsFault = !row.isInherited || row.foundByDefault > 0 || row.foundByStrict.value_or(0) > 0;
+      }
     }
     for (ProfileRuns& one : profiles) {
       if (needsReasons(phone.kind, one.detection)) one.detection.reasons = reasonsOf(wanted, wantedRuns, one);
@@ -356,6 +366,12 @@ class Selftest {
     }
   }
 
+  static void countFound(SelftestRow& row, const DiagnosticRecord& judged, bool isByDefault) {
+    if (!isByDefault && !row.foundByStrict) row.foundByStrict = 0;
+    std::uint64_t& found = isByDefault ? row.foundByDefault : *row.foundByStrict;
+    if (judged.verdict != Verdict::kPass) ++found;
+  }
+
   static void count(SelftestRow& row, const DiagnosticRecord& record) {
     ++row.runs;
     if (record.verdict == Verdict::kPass) ++row.passes;
@@ -364,6 +380,7 @@ class Selftest {
       ++row.asExpected;
     } else if (row.difference.empty()) {
       row.difference = "seed " + std::to_string(record.seed) + ": " + difference;
+      row.outcome = expectationOf(row.expected, record);
     }
     row.faultsFired.resize(std::max(row.faultsFired.size(), record.faults.size()));
     for (std::size_t i = 0; i < record.faults.size(); ++i) row.faultsFired[i] += record.faults[i].fired;
@@ -426,7 +443,9 @@ ExitCode selftestCommand(const Options& options, const Installation& installatio
   const std::string refusal = formatMessage("%@ of %@ phones were refused", refused, outcome.wanted + refused);
   if (outcome.rows.empty()) {
     if (!outcome.isComplete()) throw CommandError(ExitCode::kInterrupted, "interrupted before any phone was tested");
-    const std::string why = refused == 0 ? "no phone has an expected outcome" : refusal;
+    const std::string why = refused == 0 ? "no phone has an expected outcome; say it in the phone's file, as in "
+                                           "\"expect\": {\"DIAGNOSTIC\": {\"verdict\": \"fail\"}}"
+                                         : refusal;
     throw CommandError(ExitCode::kCannotRead, "nothing was tested: " + why);
   }
   std::ostringstream text = textFor(options.report, console);

@@ -54,7 +54,7 @@ class RealPhoneTest(CommandLineTest):
         document, _ = self.judged({"first.json": real_phone({"verdict": "pass"}),
                                    "second.json": real_phone({"verdict": "pass"})}, code=1)
         self.assertEqual([row["outcome"] for row in document["rows"]], ["false alarm"] * 2)
-        # The others are compared with the first.
+#The others are compared with the first.
         self.assertEqual([one["kind"] for one in document["phones"]], ["healthy", "changed"])
         self.assertEqual(document["totals"]["default"]["falseAlarms"], 2)
 
@@ -118,7 +118,7 @@ class SelftestTest(CommandLineTest):
         self.assertEqual(document["unusedLimits"], [])
 
     def test_what_run_all_finds_is_detected_whatever_the_phone_expects(self):
-        # Their files expect nothing of the diagnostics that notice these.
+#Their files expect nothing of the diagnostics that notice these.
         result = quazor("selftest", *FOUND_BY_OTHERS, *FOUND_BY_OTHERS_WITH_STRICT, "--seeds", "1", "--format", "json")
         self.assertEqual(result.returncode, 0, result.stderr)
         for one in json.loads(result.stdout)["phones"]:
@@ -135,7 +135,7 @@ class SelftestTest(CommandLineTest):
         phone, = document["phones"]
         self.assertEqual((phone["kind"], phone["default"]["detected"]), ("changed", 0))
         self.assertIn("TesselFaultDiagnostic is skipped: This phone has no depth camera.", phone["default"]["reasons"])
-        # An inherited expectation of such a diagnostic is left out, one of the file itself is a contradiction.
+#An inherited expectation of such a diagnostic is left out, one of the file itself is a contradiction.
         absent = {"TesselFault*": "It has no projector."}
         inherits = self.write("inherits.json", json.dumps({"base": "healthy", "title": "Mine", "absent": absent}))
         result = quazor("selftest", inherits, "--seeds", "1", "--format", "json")
@@ -262,6 +262,30 @@ class PhonesOfAUserTest(CommandLineTest):
         self.assertIn("\nRefused: 1 of 2 phones\n", text.stdout)
         (folder / "broken.json").unlink()
         self.assertEqual(self.selftest("mine/*", env=env).returncode, 0)
+
+
+    def test_a_faulty_phone_that_says_nothing_is_told_how_to_say_it(self):
+        phone = self.phone_file("mine.json", faults=[{"operation": "CaptureStream.start", "action": "fail"}])
+        result = quazor("selftest", phone, "--seeds", "1")
+        self.assertEqual(result.returncode, 1, result.stderr)
+        self.assertNotIn("FALSE ALARM", result.stdout)
+        self.assertRegex(result.stdout, r"mine\.json +nothing said +detected +detected\n")
+        self.assertRegex(result.stdout, r"mine\.json +SingleCameraDiagnostic +nothing; its base: pass +0 of 1 +NOT SAID\n")
+        told = result.stdout.split("add to it:")[1] if "add to it:" in result.stdout else result.stdout.split("to it:")[1]
+        expect = json.loads("{" + told.split("\n\n")[0] + "}")["expect"]
+        self.assertIn(BACK, expect)
+        phone = self.phone_file("mine.json", faults=[{"operation": "CaptureStream.start", "action": "fail"}], expect=expect)
+        result = quazor("selftest", phone, "--seeds", "1")
+        self.assertEqual(result.returncode, 0, result.stdout + result.stderr)
+        self.assertIn("Every run ended as its phone expects.", result.stdout)
+        bare = self.write("bare.json", json.dumps({"title": "Bare", "cameras": {}, "groups": {}, "faults": []}))
+        self.assert_refused(quazor("selftest", bare), 66, "no phone has an expected outcome; say it in the phone's file, as in "
+                            '"expect": {"DIAGNOSTIC": {"verdict": "fail"}}')
+
+    def test_the_table_of_runs_counts_what_each_profile_detects(self):
+        result = quazor("selftest", "healthy", DROPPED, REFUSED, "--seeds", "1")
+        row = next(line for line in result.stdout.splitlines() if line.startswith(f"{BACK} "))
+        self.assertEqual(row.split()[1:], ["2", "1", "1", "2", "0", "0", "of", "1", "0"], result.stdout)
 
 
 class InterruptedSelftestTest(CommandLineTest):

@@ -94,6 +94,44 @@ TEST(SelftestVerdicts, TellDetectionsFromMissesAndFalseAlarms) {
   EXPECT_TRUE(allPassed(verdictsOf({rows[0], rows[1]})));
 }
 
+TEST(SelftestVerdicts, AreNoFalseAlarmWhereThePhoneItselfSaysNothing) {
+  SelftestRow said = row("mine", passes(), 3, 2, {});
+  said.expected.key = "Name";
+  SelftestRow inherited = said;
+  inherited.isInherited = true;
+  inherited.outcome = expectationOf(inherited.expected, recordOf("Name", Verdict::kError));
+  EXPECT_THAT(verdictsOf({said, inherited}),
+              testing::ElementsAre(SelftestVerdict::kFalseAlarm, SelftestVerdict::kNotSaid));
+  EXPECT_FALSE(allPassed(verdictsOf({inherited})));
+  std::ostringstream out;
+  printSelftest(out, {{inherited}, {}, 3, 0, {}, {}});
+  EXPECT_THAT(out.str(),
+              testing::HasSubstr("\n  mine does not say what these runs must find. If it is meant to have this\n  "
+                                 "fault, add to it:\n    \"expect\": {\n      \"Name\": "
+                                 R"({"verdict":"error","error":{"domain":"Domain","code":-1,"message":"it failed"}})"
+                                 "\n    }\n"));
+  EXPECT_THAT(out.str(), testing::Not(testing::HasSubstr("FALSE ALARM")));
+}
+
+TEST(Selftest, CountsWhatEachProfileDetects) {
+  SelftestRow found = row("a", errs(), 3, 0, {1});
+  found.concernsFault = true;
+  found.foundByDefault = 3;
+  found.foundByStrict = 3;
+  SelftestRow blind = row("b", passes(), 3, 3, {1});
+  blind.concernsFault = true;
+  blind.foundByDefault = 2;
+  blind.foundByStrict = 3;
+  SelftestRow healthy = row("c", passes(), 3, 3, {});
+  healthy.foundByStrict = 0;
+  std::ostringstream out;
+  printSelftest(out, {{found, blind, healthy}, {}, 3, 0, {}, {}});
+  EXPECT_THAT(
+      out.str(),
+      testing::HasSubstr("Run   Faults  By default  Not detected  By strict  Not detected  False alarms  Invalid\n"
+                         "Name       2           1             1          2             0        0 of 1        0\n"));
+}
+
 TEST(SelftestVerdicts, CountThePhonesFaultsInAllOfItsRowsTogether) {
   const std::vector<SelftestRow> rows = {row("phone", errs(), 3, 0, {3, 0}), row("phone", passes(), 3, 3, {0, 1}),
                                          row("other", errs(), 3, 0, {0})};
@@ -108,6 +146,10 @@ SelftestOutcome outcomeOf(std::vector<SelftestRow> rows) {
     const bool healthy = one.scenario == "healthy";
     const PhoneKind kind = healthy ? PhoneKind::kHealthy : PhoneKind::kFaulty;
     outcome.phones.push_back({one.scenario, "", kind, !healthy, {3, 3 - one.passes}});
+  }
+  for (SelftestRow& one : rows) {
+    one.concernsFault = !one.expected.mustPass();
+    one.foundByDefault = one.runs - one.passes;
   }
   outcome.rows = std::move(rows);
   outcome.wanted = outcome.phones.size();
@@ -134,8 +176,8 @@ TEST(Selftest, PrintsTheMatrixAndWhatIsNotAsExpected) {
             "  missed  Name  error          2 of 3  MISSED\n"
             "  missed, Name: it differs\n"
             "\n"
-            "Run   Detected  False alarms  Invalid\n"
-            "Name    1 of 2        0 of 1        0\n"
+            "Run   Faults  By default  Not detected  By strict  Not detected  False alarms  Invalid\n"
+            "Name       2           1             1          -             -        0 of 1        0\n"
             "\n"
             "Phones: 2 with a fault, 1 healthy; runs: 3, seeds of each: 3\n"
             "By default: 1 of 2 faults detected, 1 blind spot, 0 false alarms\n"
@@ -196,7 +238,9 @@ TEST(SelftestCommand, IsRefusedWhereNothingIsTested) {
   std::ostringstream err;
   Console console{out, err};
   EXPECT_EQ(runProgram({"selftest", "--plugin", testPlugin("working")}, installation, console), ExitCode::kCannotRead);
-  EXPECT_EQ(err.str(), "quazor: nothing was tested: no phone has an expected outcome\n");
+  EXPECT_EQ(err.str(),
+            "quazor: nothing was tested: no phone has an expected outcome; say it in the phone's file, as in "
+            "\"expect\": {\"DIAGNOSTIC\": {\"verdict\": \"fail\"}}\n");
   EXPECT_EQ(out.str(), "");
 }
 

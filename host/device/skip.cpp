@@ -43,6 +43,8 @@ std::vector<SkipRule> readAbsent(const JsonCursor& phone) {
   std::vector<SkipRule> rules;
   const std::optional<JsonCursor> absent = phone.find("absent");
   if (!absent) return rules;
+  if (!absent->isObject())
+    absent->failType("an object with the reason for each diagnostic, or pattern of them, that is skipped");
   for (const auto& [pattern, reason] : absent->entries()) {
     if (pattern.empty()) absent->fail("a name is empty; expected that of a diagnostic, or a pattern.");
     rules.push_back({pattern, readSkip(reason)});

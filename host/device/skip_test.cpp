@@ -47,6 +47,14 @@ TEST(ReadAbsent, RefusesWhatHasAnotherForm) {
       EXPECT_THAT(problem.what(), HasSubstr("p.json:1: ")) << absent;
     }
   }
+  try {
+    absentIn(R"(["infrared"])");
+    ADD_FAILURE();
+  } catch (const InputError& problem) {
+    EXPECT_THAT(problem.what(),
+                HasSubstr("absent: must be an object with the reason for each diagnostic, or pattern of "
+                          "them, that is skipped"));
+  }
 }
 
 }  // namespace

@@ -166,6 +166,21 @@ std::vector<LimitCheck> checksOfResult(const std::vector<LimitCheck>& checks, st
   return wanted;
 }
 
+bool areOnSameResults(const UserLimit& one, const UserLimit& other, const std::vector<DiagnosticRecord>& records) {
+  if (one.diagnostic == other.diagnostic && one.result == other.result) return true;
+  bool areSome = false;
+  for (const DiagnosticRecord& record : records) {
+    for (const JudgedResult& judged : record.measuredResults) {
+      const auto fits = [&record, &judged](const UserLimit& limit) {
+        return appliesTo(limit, record.name) && matchesName(limit.result, judged.result.name());
+      };
+      if (fits(one) != fits(other)) return false;
+      areSome = areSome || fits(one);
+    }
+  }
+  return areSome;
+}
+
 std::size_t warningsIn(const std::vector<LimitCheck>& checks) {
   return static_cast<std::size_t>(
       std::count_if(checks.begin(), checks.end(), [](const LimitCheck& one) { return one.warns(); }));

@@ -56,6 +56,10 @@ ResultVerdict verdictOf(const JudgedResult& one, const std::vector<LimitCheck>& 
 // Those of `checks` that compare the result at `index`.
 std::vector<LimitCheck> checksOfResult(const std::vector<LimitCheck>& checks, std::size_t index);
 
+// True if both are limits on the same results of these records or, in any records, on those of the same names or
+// patterns.
+bool areOnSameResults(const UserLimit& one, const UserLimit& other, const std::vector<DiagnosticRecord>& records);
+
 // The number of checks that only warn.
 std::size_t warningsIn(const std::vector<LimitCheck>& checks);
 

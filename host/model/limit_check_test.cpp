@@ -288,5 +288,31 @@ TEST(LimitWithoutResult, HasAnErrorThatNamesWhatIsNear) {
             "that has the name 'Cameras.Bakc'; did you mean 'Cameras.Back'?");
 }
 
+DiagnosticRecord measuredRecord(const std::string& name, const std::vector<std::string>& results) {
+  DiagnosticRecord record;
+  record.name = name;
+  for (const std::string& one : results) {
+    record.measuredResults.push_back(judgeResult(QZMeasuredResult(one, Measurement(1, QZDimensionlessUnit::frames()))));
+  }
+  return record;
+}
+
+TEST(AreOnSameResults, ComparesTheResultsOfTheRecordsAndNotTheWords) {
+  const std::vector<DiagnosticRecord> records = {measuredRecord("D", {"A.Total", "A.Offset"}),
+                                                 measuredRecord("E", {"A.Total"})};
+  const auto areSame = [&records](const char* one, const char* other) {
+    return areOnSameResults(parseUserLimit(one), parseUserLimit(other), records);
+  };
+  EXPECT_TRUE(areSame("A.Total > 1", "*.Total < A.Offset"));
+  EXPECT_TRUE(areSame("D:A.Offset > 1", "A.Offset > 1"));
+  EXPECT_TRUE(areSame("E:* > 1", "E:A.Total > 1"));
+  EXPECT_FALSE(areSame("D:A.Total > 1", "A.Total > 1"));
+  EXPECT_FALSE(areSame("D:* > 1", "D:A.Total > 1"));
+  EXPECT_FALSE(areSame("A.Offset > A.Total", "A.Total > 1"));
+  // What no result of the records has.
+  EXPECT_TRUE(areSame("F:B > 1", "F:B > 2"));
+  EXPECT_FALSE(areSame("F:B > 1", "F:C > 1"));
+}
+
 }  // namespace
 }  // namespace quazor

@@ -203,7 +203,10 @@ void printEnd(std::ostream& out, const RunStarted& run, const std::vector<Diagno
     if (hasFailureAfterError(records))
       out << "A failure after an error counts as an error, unless --accept-flaky is given.\n";
   }
-  if (!run.ofExperiments) printFailures(out, records, colour, text.isExplained);
+  if (!run.ofExperiments) {
+    printUnlimited(out, records);
+    printFailures(out, records, colour, text.isExplained);
+  }
   const ExitRules rules{text.allowSkips, run.acceptFlaky};
   if (interrupted || runVerdictOf(records, run.acceptFlaky) != Verdict::kSkip) return;
   if (exitCodeOf(records, rules) == ExitCode::kAllPassed) return;

@@ -79,8 +79,8 @@ std::string reportText(Format format, const RunStarted& run, const std::vector<D
 void printReport(std::ostream& out, const RunStarted& run, const DiagnosticRecord& record, TextStyle style);
 
 // Prints the end of the text report: of an analysis, the diagnostic in which the recorded run stopped; the number of
-// records per verdict, unless there is only one and the run was not interrupted, and what did not pass
-// (short_report.h).
+// records per verdict, unless there is only one and the run was not interrupted, what passed without any
+// limit, and what did not pass (short_report.h).
 void printEnd(std::ostream& out, const RunStarted& run, const std::vector<DiagnosticRecord>& finished,
               const std::optional<std::string>& interrupted, const TextContent& text, bool colour);
 

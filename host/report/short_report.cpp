@@ -206,4 +206,20 @@ void printFailures(std::ostream& out, const std::vector<DiagnosticRecord>& recor
   questions.print(out, columnsOf(out));
 }
 
+void printUnlimited(std::ostream& out, const std::vector<DiagnosticRecord>& records) {
+  std::vector<std::string> names;
+  for (const DiagnosticRecord& record : records) {
+    if (record.verdict != Verdict::kPass || record.measuredResults.empty()) continue;
+    const std::vector<ResultVerdict> verdicts = verdictsOf(record, limitChecksOf(record));
+    const bool isUnlimited =
+        std::all_of(verdicts.begin(), verdicts.end(), [](ResultVerdict one) { return one == ResultVerdict::kNone; });
+    if (isUnlimited && !holds(names, printable(record.name))) names.push_back(printable(record.name));
+  }
+  if (names.empty()) return;
+  const std::string who = listText(names, kMaxNamed);
+  out << formatMessage(
+      "No result of %@ has a limit, so %@ measured. Add limits: --limit 'RESULT >= NUMBER', or --profile.\n", who,
+      names.size() == 1 ? "it passes whatever is" : "they pass whatever is");
+}
+
 }  // namespace quazor

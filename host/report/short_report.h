@@ -28,4 +28,8 @@ std::vector<std::string> topicsOf(const DiagnosticRecord& record);
 void printFailures(std::ostream& out, const std::vector<DiagnosticRecord>& records, bool colour,
                    const std::function<bool(const std::string& topic)>& isExplained);
 
+// Prints a sentence about the diagnostics that passed although none of their results has a limit, and how to set one;
+// nothing if there are none.
+void printUnlimited(std::ostream& out, const std::vector<DiagnosticRecord>& records);
+
 }  // namespace quazor

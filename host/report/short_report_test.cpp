@@ -78,6 +78,37 @@ TEST(PrintShortRecord, ShowsTheErrorAndItsCause) {
             "\n");
 }
 
+std::string unlimited(const std::vector<DiagnosticRecord>& records) {
+  std::ostringstream out;
+  printUnlimited(out, records);
+  return out.str();
+}
+
+DiagnosticRecord withoutLimits(const std::string& name, Verdict verdict) {
+  DiagnosticRecord record = recordOf(name, verdict);
+  record.measuredResults.clear();
+  record.measuredResults.push_back(judgeResult(QZMeasuredResult("R", Measurement(1, QZDimensionlessUnit::events()))));
+  return record;
+}
+
+TEST(PrintUnlimited, NamesDiagnosticsThatPassWhateverIsMeasured) {
+  const std::string advice = " measured. Add limits: --limit 'RESULT >= NUMBER', or --profile.\n";
+  EXPECT_EQ(unlimited({withoutLimits("A", Verdict::kPass)}),
+            "No result of A has a limit, so it passes whatever is" + advice);
+  EXPECT_EQ(unlimited({withoutLimits("A", Verdict::kPass), withoutLimits("B\033", Verdict::kPass),
+                       withoutLimits("A", Verdict::kPass)}),
+            "No result of A, B\\x1b has a limit, so they pass whatever is" + advice);
+}
+
+TEST(PrintUnlimited, SaysNothingOfWhatIsJudgedOrDidNotPass) {
+  DiagnosticRecord nothing = withoutLimits("A", Verdict::kPass);
+  nothing.measuredResults.clear();
+  for (const LimitSeverity severity : {LimitSeverity::kFail, LimitSeverity::kWarn}) {
+    EXPECT_EQ(unlimited({withLimit(withoutLimits("A", Verdict::kPass), "R >= 0", severity)}), "");
+  }
+  EXPECT_EQ(unlimited({recordOf("A", Verdict::kPass), withoutLimits("A", Verdict::kError), nothing}), "");
+}
+
 TEST(PrintFailures, NamesWhatDidNotPassAndTheCommandThatExplainsIt) {
   const std::vector<DiagnosticRecord> records = {recordOf("A", Verdict::kPass), recordOf("B\033", Verdict::kFail),
                                                  recordOf("C", Verdict::kError), recordOf("D", Verdict::kError)};

@@ -73,6 +73,9 @@ class Timeline::Writer {
     return text_;
   }
 
+  bool isEmpty() const { return isEmpty_; }
+  nanoseconds end() const { return end_; }
+
  private:
   // The diagnostic that is running; its times are those of the time line.
   struct Running {
@@ -262,8 +265,15 @@ class Timeline::Writer {
     addEvent("M", {process, row}, R"(,"name":"thread_name","args":{"name":)" + quoted(name) + "}");
   }
 
+  // The row of the whole run is in every part.
+  bool isShown(Row row, nanoseconds begin, nanoseconds end) {
+    const bool isInPart = end >= part_.from && begin <= part_.to;
+    if (isInPart && row.process != 0) isEmpty_ = false;
+    return isInPart;
+  }
+
   void addDuration(Row row, nanoseconds begin, nanoseconds end, const std::string& name, const std::string& arguments) {
-    if (end < part_.from || begin > part_.to) return;
+    if (!isShown(row, begin, end)) return;
     // Viewers turn a duration into a begin and an end and sort these by time. Only whole microseconds add up to the
     // begin of the next duration without a rounding error, and one without length would end too late.
     const auto first = std::chrono::floor<std::chrono::microseconds>(begin);
@@ -279,7 +289,7 @@ class Timeline::Writer {
   }
 
   void addAt(const char* kind, Row row, nanoseconds at, const std::string& name, const std::string& arguments) {
-    if (at < part_.from || at > part_.to) return;
+    if (!isShown(row, at, at)) return;
     addEvent(kind, row, ",\"ts\":" + microseconds(at) + ",\"name\":" + quoted(name) + ",\"args\":" + arguments);
   }
 
@@ -302,6 +312,7 @@ class Timeline::Writer {
   std::string text_;
   bool isTooLarge_ = false;
   bool isFinished_ = false;
+  bool isEmpty_ = true;
 };
 
 Timeline::Timeline(const TimelinePart& part, std::size_t most) : writer_(std::make_unique<Writer>(part, most)) {}
@@ -311,6 +322,10 @@ Timeline::~Timeline() = default;
 void Timeline::onEvent(const RunEvent& event) { writer_->add(event); }
 
 const std::string& Timeline::text() { return writer_->finish(); }
+
+bool Timeline::isEmpty() const { return writer_->isEmpty(); }
+
+std::chrono::nanoseconds Timeline::end() const { return writer_->end(); }
 
 std::string timelineText(const std::vector<RunEvent>& events, const TimelinePart& part, std::size_t most) {
   Timeline timeline(part, most);

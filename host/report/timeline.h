@@ -17,6 +17,8 @@ namespace quazor {
 struct TimelinePart {
   std::chrono::nanoseconds from = std::chrono::nanoseconds::min();
   std::chrono::nanoseconds to = std::chrono::nanoseconds::max();
+
+  bool isEverything() const { return from == std::chrono::nanoseconds::min() && to == std::chrono::nanoseconds::max(); }
 };
 
 // The largest time line that is written. Viewers load it into memory several times over.
@@ -44,6 +46,11 @@ class Timeline final : public RunEventSink {
 
   // The whole text, after the last event. Throws a TimelineTooLarge if it would be longer than `most` bytes.
   const std::string& text();
+
+  // After text(): true if no diagnostic and nothing that belongs to one is in the part.
+  bool isEmpty() const;
+  // After text(): where the whole time line ends.
+  std::chrono::nanoseconds end() const;
 
  private:
   class Writer;

@@ -133,6 +133,23 @@ def selftest_cameras(step):
            f"the matrix is {step.out('matrix')}")
 
 
+def single_camera_faults(step):
+    entry = step.ran("clock_beyond")
+    failed = {result["name"] for result in entry["measuredResults"] if result["verdict"] == "fail"}
+    expect_equal("what fails with a clock beyond a century", failed, {"FrameRate", "BackwardTimeStamps"})
+    # The numbers of the frames begin again at 0; none is missing.
+    results = {result["name"]: result["value"] for result in step.passed("wrapped_sequence")["measuredResults"]}
+    expect_equal("the missing numbers", results["Errors.SequenceGapCount"], 0)
+    numbers = [buffer.sequence for buffer in read_trace(step.text("wrapped_sequence.trace")).dequeued]
+    expect(numbers[0] > numbers[-1], f"the frames are numbered from {numbers[0]} to {numbers[-1]}: nothing wraps")
+    expect_equal("the errors of the self-test", step.text("selftest.stderr"), "")
+    expect_equal("the exit code of the self-test", step.exit_code("selftest"), 0)
+    found = {phone["phone"].rpartition("/")[2].removesuffix(".json"): phone["default"]["detected"]
+             for phone in json.loads(step.out("selftest"))["phones"] if phone["kind"] == "faulty"}
+    refused = ("control_refused", "rate_refused", "start_refused", "never_stops", "counters_unreadable")
+    expect_equal("the faults that are detected", found, dict.fromkeys(refused, 1))
+
+
 def refused_start(call):
     def check(step):
         error = step.ended_in_error("refused", CAPTURE, 204)

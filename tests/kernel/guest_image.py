@@ -45,13 +45,14 @@ def build(directory, *options):
 
 
 def system_archive(kernel):
-    """The common part of all runs: busybox and the modules, as bytes."""
+    """The common part of all runs: busybox, the test of video drivers and the modules, as bytes."""
     archive = Archive()
     busybox = pathlib.Path(shutil.which("busybox"))
     archive.add_file("/bin/busybox", busybox)
     for name in subprocess.run([busybox, "--list"], capture_output=True, text=True, check=True).stdout.split():
         if name != "busybox":
             archive.add_link(f"/bin/{name}", "busybox")
+    add_program(archive, "/usr/bin/v4l2-compliance", pathlib.Path(shutil.which("v4l2-compliance")))
     for directory in ("/proc", "/sys", "/dev", "/tmp", "/run", "/rig/out", "/rig/sanitizer"):
         archive.add_directory(directory)
     archive.add_character_device("/dev/console", 5, 1)

@@ -179,6 +179,7 @@ int FakeV4l2Api::guards() {
 }
 
 int FakeV4l2Api::open(const std::string& path) {
+  if (beforeOpen) beforeOpen(path);
   const std::lock_guard lock(mutex_);
   const auto found = nodes_.find(path);
   if (found == nodes_.end()) return -ENOENT;

@@ -118,6 +118,8 @@ class FakeV4l2Api : public V4l2Api {
 
   // Makes the request fail `times` times on that node, after `after` successful calls.
   void failNext(const std::string& path, unsigned long request, int number, int times = 1, int after = 0);
+  // Called before each open(), on the same thread. Set it while there are no calls.
+  std::function<void(const std::string& path)> beforeOpen;
   // Called before each call of a driver, on the same thread. Set it while there are no calls.
   std::function<void(unsigned long request)> beforeCall;
   // Called after each successful call, and may change its answer. Set it while there are no calls.

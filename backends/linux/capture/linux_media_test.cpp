@@ -6,14 +6,19 @@
 #include <linux/v4l2-subdev.h>
 
 #include <cerrno>
+#include <filesystem>
+#include <fstream>
 #include <optional>
 
 namespace quazor {
 namespace {
 
 using namespace std::chrono_literals;
+using ::testing::AllOf;
 using ::testing::ElementsAre;
+using ::testing::EndsWith;
 using ::testing::HasSubstr;
+using ::testing::StartsWith;
 
 // A user of the camera on the fake board.
 struct BoardUser {
@@ -264,6 +269,36 @@ TEST_F(LinuxMediaTest, WhatCannotBeSetIsToldWithEntityAndPadAndTheLinksAreSetBac
     user.close();
     EXPECT_TRUE(user.board.kernel->isIdle()) << row.name;
   }
+}
+
+// After the controllers were listed and the graph was read, the kernel gives a number to another device.
+TEST_F(LinuxMediaTest, ADeviceThatAnotherReplacedIsRefusedBeforeItIsSet) {
+  const std::filesystem::path sysfs = board.kernel->roots().sysfs;
+  const std::vector<FakeLink> links = board.links();
+  int opened = 0;
+  board.kernel->beforeOpen = [&](const std::string& path) {
+    if (!path.ends_with("/media0") || ++opened != 2) return;  // the first is only asked what it is
+    const std::filesystem::path entry = sysfs / "bus" / "media" / "devices" / "media0";
+    std::filesystem::rename(entry, entry.string() + "-unplugged");
+    std::filesystem::create_directory(entry);
+  };
+  EXPECT_THAT(take(),
+              AllOf(StartsWith("9 media0 ("), EndsWith(") was replaced by another device before it was opened.")));
+  EXPECT_EQ(opened, 2);
+  EXPECT_EQ(board.links(), links);
+
+  board.kernel->beforeOpen = [&](const std::string& path) {
+    const std::string name = std::filesystem::path(path).filename().string();
+    if (!name.starts_with("v4l-subdev")) return;
+    for (const auto& entry : std::filesystem::directory_iterator(sysfs / "dev" / "char")) {
+      std::ofstream(entry.path() / "uevent") << "DEVNAME=other\n";
+    }
+  };
+  EXPECT_THAT(take(),
+              AllOf(StartsWith("9 v4l-subdev"), EndsWith(" was replaced by another device before it was opened.")));
+  EXPECT_EQ(board.links(), links);
+  close();
+  EXPECT_TRUE(board.kernel->isIdle());
 }
 
 TEST_F(LinuxMediaTest, LinksOutsideOfTheBindingAreLeftAsTheyAre) {

@@ -19,7 +19,8 @@ namespace {
 constexpr std::uint32_t kMaxItems = 65536;
 
 MediaDeviceInfo ask(V4l2Api& kernel, const std::filesystem::path& path) {
-  MediaDeviceInfo info{path, {}, {}, {}, nullptr};
+  MediaDeviceInfo info;
+  info.path = path;
   const int descriptor = kernel.openForQueries(path.string());
   if (descriptor < 0) {
     failSystemCall(&info.problem, "open", path.string(), -descriptor);
@@ -68,7 +69,11 @@ std::vector<MediaDeviceInfo> mediaDevices(const std::shared_ptr<V4l2Api>& kernel
   std::filesystem::directory_iterator entry(roots.sysfs / "bus" / "media" / "devices", problem);
   for (; !problem && entry != std::filesystem::directory_iterator(); entry.increment(problem)) {
     const std::string name = entry->path().filename().string();
-    if (const auto number = nodeNumber(name, "media")) numbered.emplace_back(*number, ask(*kernel, roots.dev / name));
+    if (const auto number = nodeNumber(name, "media")) {
+      const NodeIdentity identity = NodeIdentity::of(entry->path());
+      numbered.emplace_back(*number, ask(*kernel, roots.dev / name));
+      numbered.back().second.identity = identity;
+    }
   }
   std::ranges::sort(numbered, {}, [](const auto& one) { return one.first; });
   std::vector<MediaDeviceInfo> devices;
@@ -129,9 +134,23 @@ MediaDevice::~MediaDevice() {
 }
 
 bool MediaDevice::readGraph(DiagnosticErrorPtr* error) {
+  std::optional<MediaGraph> read = graphNow(error);
+  if (read) graph_ = std::move(*read);
+  return read.has_value();
+}
+
+bool MediaDevice::hasStill(const MediaEntity& entity, DiagnosticErrorPtr* error) const {
+  const std::optional<MediaGraph> now = graphNow(error);
+  if (!now) return false;
+  const MediaEntity* const found = now->entity(entity.id);
+  return (found != nullptr && found->name == entity.name && found->node == entity.node) ||
+         refuseReplaced(entity.node.string() + " (\"" + entity.name + "\")", error);
+}
+
+std::optional<MediaGraph> MediaDevice::graphNow(DiagnosticErrorPtr* error) const {
   const std::optional<MediaTopology> read = topology(error);
-  if (!read) return false;
-  graph_ = MediaGraph(*read, [this](std::uint32_t major, std::uint32_t minor) -> std::filesystem::path {
+  if (!read) return std::nullopt;
+  return MediaGraph(*read, [this](std::uint32_t major, std::uint32_t minor) -> std::filesystem::path {
     const std::string number = std::to_string(major) + ":" + std::to_string(minor);
     std::ifstream file(roots_.sysfs / "dev" / "char" / number / "uevent");
     constexpr std::string_view kKey = "DEVNAME=";
@@ -140,7 +159,6 @@ bool MediaDevice::readGraph(DiagnosticErrorPtr* error) {
     }
     return {};
   });
-  return true;
 }
 
 // The topology may grow between the question for its size and the one for its contents.
@@ -268,7 +286,9 @@ std::shared_ptr<MediaDevice> MediaDevices::open(const MediaDeviceMatch& match, c
   }
   std::weak_ptr<MediaDevice>& known = opened_[fitting.front()->path];
   if (std::shared_ptr<MediaDevice> device = known.lock()) return device->readGraph(error) ? device : nullptr;
-  std::shared_ptr<MediaDevice> device = MediaDevice::open(kernel_, roots_, fitting.front()->path, error);
+  const MediaDeviceInfo& found = *fitting.front();
+  std::shared_ptr<MediaDevice> device = MediaDevice::open(kernel_, roots_, found.path, error);
+  if (device == nullptr || !isStillThere(found.identity, textOf(found), error)) return nullptr;
   known = device;
   return device;
 }

@@ -18,6 +18,7 @@ namespace quazor {
 
 struct MediaDeviceInfo {
   std::filesystem::path path;  // for example /dev/media0
+  NodeIdentity identity{};
   // The members below are empty if the device cannot be opened; `problem` then gives the reason.
   std::string driver;
   std::string model;
@@ -54,6 +55,8 @@ class MediaDevice final {
   // The topology when it was last read.
   const MediaGraph& graph() const { return graph_; }
   bool readGraph(DiagnosticErrorPtr* error);
+  // True if the controller, asked again, has the entity with the same device file. graph() stays.
+  bool hasStill(const MediaEntity& entity, DiagnosticErrorPtr* error) const;
   // The only entity with that name; null and an error (kNotSupported, kAmbiguous) otherwise. Messages begin with
   // `purpose`.
   const MediaEntity* entity(const std::string& name, const std::string& purpose, DiagnosticErrorPtr* error) const;
@@ -71,6 +74,7 @@ class MediaDevice final {
   static std::shared_ptr<MediaDevice> opened(std::shared_ptr<V4l2Api> kernel, DeviceRoots roots,
                                              const std::filesystem::path& path, int descriptor,
                                              DiagnosticErrorPtr* error);
+  std::optional<MediaGraph> graphNow(DiagnosticErrorPtr* error) const;
   std::optional<MediaTopology> topology(DiagnosticErrorPtr* error) const;
   int setFlags(const MediaLink& link, std::uint32_t flags) const;
   const MediaLink* findLink(const LinkBinding& wanted, const std::string& purpose, DiagnosticErrorPtr* error) const;

@@ -35,7 +35,9 @@ std::shared_ptr<Subdevice> MediaPipeline::subdevice(const MediaEntity& entity, D
   const auto known = std::ranges::find(opened_, entity.id, [](const auto& one) { return one->entity().id; });
   if (known != opened_.end()) return *known;
   std::shared_ptr<Subdevice> opened = Subdevice::open(kernel_, entity, port_, error);
-  if (opened != nullptr) opened_.push_back(opened);
+  // Before anything is set: its number may have become that of another device.
+  if (opened == nullptr || !device_->hasStill(entity, error)) return nullptr;
+  opened_.push_back(opened);
   return opened;
 }
 

@@ -48,7 +48,8 @@ class Probe {
     binding_["$schema"] = "binding.schema.json";
     binding_["title"] = "This machine";
     tell("Cameras");
-    bindCameras(probeCameras(sources_.kernel, sources_.devices, &lines_));
+    ProbedCameras probed = probeCameras(sources_.kernel, sources_.devices, &lines_);
+    bindCameras(std::move(probed.cameras));
     tell("HID devices");
     probeHid();
     tell("Displays");
@@ -56,7 +57,7 @@ class Probe {
     tell("Counters");
     probeCounterFiles();
     probeTracepoints();
-    binding_["absent"] = absentDiagnostics(binding_);
+    binding_["absent"] = absentDiagnostics(binding_, probed.forbidden);
     // Names may contain arbitrary bytes; invalid UTF-8 is replaced.
     return {std::move(lines_), binding_.dump(2, ' ', false, Json::error_handler_t::replace) + "\n"};
   }

@@ -23,13 +23,15 @@ bool hasProjector(const Json& binding) {
 
 }  // namespace
 
-Json absentDiagnostics(const Json& binding) {
+Json absentDiagnostics(const Json& binding, bool forbidden) {
   Json absent = Json::object();
-  if (!binding.contains("cameras")) absent["SingleCameraDiagnostic"] = "No camera is bound.";
-  if (!hasGroupOf(binding, 3, "back")) absent["CameraSyncDiagnostic.Back"] = "Fewer than three back cameras are bound.";
-  if (!hasGroupOf(binding, 2, "front")) {
-    absent["CameraSyncDiagnostic.Front"] = "Fewer than two front cameras are bound.";
-  }
+  const auto add = [&](const char* diagnostic, const std::string& reason) {
+    absent[diagnostic] =
+        reason + (forbidden ? " A camera could not be opened without permission: get it and probe again." : "");
+  };
+  if (!binding.contains("cameras")) add("SingleCameraDiagnostic", "No camera is bound.");
+  if (!hasGroupOf(binding, 3, "back")) add("CameraSyncDiagnostic.Back", "Fewer than three back cameras are bound.");
+  if (!hasGroupOf(binding, 2, "front")) add("CameraSyncDiagnostic.Front", "Fewer than two front cameras are bound.");
   if (!hasProjector(binding)) absent["TesselFaultDiagnostic"] = "No camera with a projector is bound.";
   // The probe cannot know which counters of a machine are those of a depth module.
   absent["TesselTelemonDiagnostic"] = "The report channels of a depth module are not bound.";

@@ -6,7 +6,7 @@
 namespace quazor {
 
 // The entry "absent" for a binding that the probe has written: the installed diagnostics that need a part which it does
-// not bind, by name, each with the reason. Any thread.
-nlohmann::ordered_json absentDiagnostics(const nlohmann::ordered_json& binding);
+// not bind, by name, each with the reason, which is perhaps that cameras were `forbidden` to this user. Any thread.
+nlohmann::ordered_json absentDiagnostics(const nlohmann::ordered_json& binding, bool forbidden);
 
 }  // namespace quazor

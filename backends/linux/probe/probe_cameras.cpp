@@ -175,7 +175,7 @@ class CameraProbe {
   CameraProbe(const std::shared_ptr<V4l2Api>& kernel, const DeviceRoots& roots, std::vector<std::string>* lines)
       : kernel_(kernel), nodes_(videoNodes(kernel, roots)), media_(kernel, roots), lines_(lines) {}
 
-  Json run() {
+  ProbedCameras run() {
     if (nodes_.empty()) {
       tell("  none: no driver offers a video node (/dev/video*). Is the camera connected, and its driver loaded?");
     }
@@ -191,15 +191,16 @@ class CameraProbe {
         tell("    unsuitable: it does not capture video to mapped buffers");
       }
     }
-    return std::move(cameras_);
+    return {std::move(cameras_), forbidden_};
   }
 
  private:
   void tell(std::string line) const { lines_->push_back(std::move(line)); }
 
-  void tellProblem(const DiagnosticError& problem) const {
+  void tellProblem(const DiagnosticError& problem) {
     tell("    unsuitable: " + problem.localizedDescription());
     if (problem.code() == static_cast<std::int64_t>(LinuxErrorCode::kNoAccess)) {
+      forbidden_ = true;
       tell("    Its group, usually \"video\", may use it; docs/linux.md has a udev rule for another group.");
     }
   }
@@ -352,11 +353,13 @@ class CameraProbe {
   std::vector<LinkBinding> links_;  // of the cameras in the binding
   std::vector<std::string>* const lines_;
   Json cameras_ = Json::object();
+  bool forbidden_ = false;
 };
 
 }  // namespace
 
-Json probeCameras(const std::shared_ptr<V4l2Api>& kernel, const DeviceRoots& roots, std::vector<std::string>* lines) {
+ProbedCameras probeCameras(const std::shared_ptr<V4l2Api>& kernel, const DeviceRoots& roots,
+                           std::vector<std::string>* lines) {
   return CameraProbe(kernel, roots, lines).run();
 }
 

@@ -12,9 +12,14 @@
 
 namespace quazor {
 
-// Adds lines about all video nodes (see MachineProbe) and returns the entry "cameras" of a binding: the nodes that fit,
-// assigned to the ports in their default order.
-nlohmann::ordered_json probeCameras(const std::shared_ptr<V4l2Api>& kernel, const DeviceRoots& roots,
-                                    std::vector<std::string>* lines);
+struct ProbedCameras {
+  nlohmann::ordered_json cameras;  // the entry "cameras" of a binding
+  bool forbidden = false;          // this user may not open one of the nodes
+};
+
+// Adds lines about all video nodes (see MachineProbe) and returns the nodes that fit, assigned to the ports in their
+// default order.
+ProbedCameras probeCameras(const std::shared_ptr<V4l2Api>& kernel, const DeviceRoots& roots,
+                           std::vector<std::string>* lines);
 
 }  // namespace quazor

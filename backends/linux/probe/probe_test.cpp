@@ -434,6 +434,21 @@ TEST_F(ProbeTest, SkipsTheDiagnosticsWhosePartsAreAbsent) {
   EXPECT_THAT(absentIn(probe().binding), UnorderedElementsAre("TesselFaultDiagnostic", "TesselTelemonDiagnostic"));
 }
 
+TEST_F(ProbeTest, SaysWhenAPartIsMissingForWantOfPermission) {
+  const auto reasons = [this] { return nlohmann::json::parse(probe().binding).at("absent"); };
+  kernel_->add(0, fakeCamera("fake:0"));
+  EXPECT_EQ(reasons().at("CameraSyncDiagnostic.Back"), "Fewer than three back cameras are bound.");
+  FakeNode closed = fakeCamera("fake:1");
+  closed.openProblem = EACCES;
+  kernel_->add(1, closed);
+  const nlohmann::json absent = reasons();
+  EXPECT_EQ(
+      absent.at("CameraSyncDiagnostic.Back"),
+      "Fewer than three back cameras are bound. A camera could not be opened without permission: get it and probe "
+      "again.");
+  EXPECT_EQ(absent.at("TesselFaultDiagnostic"), "No camera with a projector is bound.");
+}
+
 TEST(ProbeOfTheRunningSystem, CanBeMade) {
   const MachineProbe found = probeMachine(sourcesOfRunningSystem());
   EXPECT_THAT(found.lines, testing::IsSupersetOf({"Cameras", "HID devices", "Displays", "Counters"}));

@@ -6,6 +6,7 @@
 #include "contract/message_format.h"
 
 #include <algorithm>
+#include <array>
 #include <cerrno>
 #include <cstring>
 #include <utility>
@@ -113,14 +114,12 @@ std::shared_ptr<V4l2Device> V4l2Device::open(std::shared_ptr<V4l2Api> kernel, co
 std::shared_ptr<V4l2Device> V4l2Device::open(std::shared_ptr<V4l2Api> kernel, const V4l2DeviceInfo& info,
                                              DiagnosticErrorPtr* error) {
   std::shared_ptr<V4l2Device> node = open(std::move(kernel), info.path.string(), error);
-  if (node == nullptr ||
-      (fixedText(node->capability_.driver) == info.driver && fixedText(node->capability_.card) == info.card &&
-       fixedText(node->capability_.bus_info) == info.busInfo)) {
-    return node;
-  }
-  refuseLinux(error, LinuxErrorCode::kDeviceGone, "%@ was replaced by another device before it was opened.",
-              textOf(info));
-  return nullptr;
+  if (node == nullptr) return node;
+  const v4l2_capability& found = node->capability_;
+  const bool isAlike = fixedText(found.driver) == info.driver && fixedText(found.card) == info.card &&
+                       fixedText(found.bus_info) == info.busInfo;
+  const bool isSame = isAlike ? isStillThere(info.identity, textOf(info), error) : refuseReplaced(textOf(info), error);
+  return isSame ? node : nullptr;
 }
 
 std::shared_ptr<V4l2Device> V4l2Device::openSubdevice(std::shared_ptr<V4l2Api> kernel, const std::string& path,
@@ -310,13 +309,15 @@ void V4l2Device::add(const v4l2_query_ext_ctrl& query) {
   if (!isHeading && (query.flags & V4L2_CTRL_FLAG_DISABLED) == 0) controls_.push_back(controlOf(query));
 }
 
-// Only EINVAL ends the list. Any other error concerns one control, whose id the driver then does not report.
+// Only EINVAL ends the list, and not even that if a control that this backend needs comes later. Any other error
+// concerns one control, whose id the driver then does not report.
 void V4l2Device::listControls() {
   std::uint32_t last = 0;
   for (std::uint32_t i = 0; i < kMaxItems; ++i) {
     v4l2_query_ext_ctrl found{};
     const int result = query(last | V4L2_CTRL_FLAG_NEXT_CTRL, &found);
-    if (result == EINVAL || result == ENOTTY) return;
+    if (result == ENOTTY || (result == EINVAL && !hasNeededControlAfter(last))) return;
+    if (result == EINVAL) undescribed_.push_back({last, result, true});
     if (result == 0) {
       if (found.id <= last) return;  // the driver would repeat its list
       add(found);
@@ -325,7 +326,7 @@ void V4l2Device::listControls() {
     }
     const std::optional<std::uint32_t> next = nextExistingControl(last);
     if (!next) {
-      undescribed_.push_back({last, result, true});
+      if (result != EINVAL) undescribed_.push_back({last, result, true});
       return;
     }
     const int problem = query(*next, &found);
@@ -336,6 +337,15 @@ void V4l2Device::listControls() {
     }
     last = *next;
   }
+}
+
+bool V4l2Device::hasNeededControlAfter(std::uint32_t last) const {
+  constexpr std::array kNeeded{V4L2_CID_EXPOSURE_AUTO, V4L2_CID_EXPOSURE_ABSOLUTE, V4L2_CID_VBLANK, V4L2_CID_HBLANK,
+                               V4L2_CID_PIXEL_RATE};
+  return std::ranges::any_of(kNeeded, [&](std::uint32_t id) {
+    v4l2_query_ext_ctrl found{};
+    return id > last && query(id, &found) != EINVAL;
+  });
 }
 
 // The first control after `last`, found by asking for each id of the known classes: a control that exists but cannot be

@@ -125,6 +125,7 @@ class V4l2Device final {
   void listControls();
   int query(std::uint32_t id, v4l2_query_ext_ctrl* query) const;
   void add(const v4l2_query_ext_ctrl& query);
+  bool hasNeededControlAfter(std::uint32_t last) const;
   std::optional<std::uint32_t> nextExistingControl(std::uint32_t last) const;
   std::optional<std::uint32_t> pixelFormatOf(const VideoMode& mode, DiagnosticErrorPtr* error) const;
   std::vector<FrameSize> sizesOf(std::uint32_t fourcc, std::uint32_t& left) const;

@@ -4,8 +4,6 @@
 #include "backends/linux/system/node_number.h"
 #include "backends/linux/video/v4l2_device.h"
 
-#include <sys/stat.h>
-
 #include <algorithm>
 #include <charconv>
 #include <fstream>
@@ -37,12 +35,6 @@ std::optional<std::uint32_t> usbInterfaceOf(const std::filesystem::path& entry) 
   const auto [end, problem] = std::from_chars(line.data(), line.data() + line.size(), number, 16);
   if (problem != std::errc() || end != line.data() + line.size()) return std::nullopt;
   return number;
-}
-
-NodeIdentity identityOf(const std::filesystem::path& entry) {
-  struct stat status {};
-  if (::stat(entry.c_str(), &status) != 0) return {};
-  return {status.st_ino, std::int64_t{status.st_ctim.tv_sec} * 1'000'000'000 + status.st_ctim.tv_nsec};
 }
 
 // Null if the node is not known, or was not usable.
@@ -102,7 +94,7 @@ std::vector<V4l2DeviceInfo> videoNodes(const std::shared_ptr<V4l2Api>& kernel, c
     node.systemName = firstLineOf(entry->path() / "name");
     node.device = deviceOf(entry->path(), roots.sysfs);
     node.usbInterface = usbInterfaceOf(entry->path());
-    node.identity = identityOf(entry->path());
+    node.identity = NodeIdentity::of(entry->path());
     if (const V4l2DeviceInfo* const same = knownNode(known, node)) {
       node = *same;
     } else {

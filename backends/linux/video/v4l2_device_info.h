@@ -2,6 +2,7 @@
 #pragma once
 
 #include "backends/linux/binding/binding.h"
+#include "backends/linux/system/node_identity.h"
 #include "backends/linux/video/v4l2_api.h"
 #include "contract/diagnostic_error.h"
 
@@ -47,14 +48,6 @@ enum class VideoNodeKind {
   kCamera,    // captures video to buffers that can be mapped
   kMetadata,  // captures metadata to buffers that can be mapped
   kOther      // not supported: outputs, radios, and cameras with only read()
-};
-
-// Tells a node from one that replaced it: the kernel's number of its entry in sysfs, and when the entry was made.
-struct NodeIdentity {
-  std::uint64_t number = 0;
-  std::int64_t made = 0;  // in nanoseconds
-
-  friend bool operator==(const NodeIdentity&, const NodeIdentity&) = default;
 };
 
 struct V4l2DeviceInfo {

@@ -115,6 +115,22 @@ TEST(VideoNodesTest, ANodeThatWasReplacedBeforeItIsOpenedIsRefused) {
   EXPECT_TRUE(kernel->isIdle());
 }
 
+// Twins that were unplugged and plugged in the other way round differ in nothing else.
+TEST(VideoNodesTest, ATwinThatTookTheNumberOfANodeIsRefused) {
+  const Kernel kernel = std::make_shared<FakeV4l2Api>();
+  const std::string path = kernel->add(0, fakeCamera("fake:0"));
+  kernel->add(1, fakeCamera("fake:0"));
+  const std::vector<V4l2DeviceInfo> nodes = videoNodes(kernel, kernel->roots());
+  const std::filesystem::path entries = kernel->roots().sysfs / "class" / "video4linux";
+  std::filesystem::rename(entries / "video0", entries / "unplugged");
+  std::filesystem::rename(entries / "video1", entries / "video0");
+  EXPECT_EQ(outcome([&](auto* error) { return V4l2Device::open(kernel, nodes.at(0), error); }),
+            "9 " + path +
+                " (driver fake, card fake camera, bus fake:0) was replaced by another device before it was "
+                "opened.");
+  EXPECT_TRUE(kernel->isIdle());
+}
+
 TEST(VideoNodesTest, ANodeTellsWhatItIsOrWhyItCannotBeOpened) {
   const Kernel kernel = std::make_shared<FakeV4l2Api>();
   kernel->add(0, fakeCamera("fake:0"));
@@ -320,6 +336,36 @@ TEST(OpenedVideoNodeTest, AControlThatCannotBeDescribedDoesNotEndTheList) {
       "5 " + path + " has no control \"Contrast\"; its driver does not describe the controls " + undescribed + ".");
   EXPECT_TRUE(node->mayHaveControl(V4L2_CID_CONTRAST));
   EXPECT_FALSE(node->mayHaveControl(V4L2_CID_BACKLIGHT_COMPENSATION));
+}
+
+// A driver may say that there is no further control where there is one that it cannot describe.
+TEST(OpenedVideoNodeTest, AListThatEndsBeforeANeededControlGoesOn) {
+  const Kernel kernel = std::make_shared<FakeV4l2Api>();
+  FakeNode camera = fakeCamera("fake:0");
+  camera.controls = {{V4L2_CID_BRIGHTNESS, "Brightness"},
+                     {V4L2_CID_CONTRAST, "Contrast"},
+                     {V4L2_CID_GAIN, "Gain"},
+                     {V4L2_CID_EXPOSURE_AUTO, "Auto Exposure", 0, 3, 1, V4L2_CTRL_TYPE_MENU},
+                     {V4L2_CID_PRIVACY, "Privacy"}};
+  camera.controls[1].describeProblem = EINVAL;
+  const std::string path = kernel->add(0, camera);
+  const auto namesOf = [&] {
+    std::string names;
+    const auto node = V4l2Device::open(kernel, path, nullptr);
+    for (const VideoControl& control : node->controls()) names += control.name + " ";
+    return names + "(" + node->undescribedControls() + ")";
+  };
+  EXPECT_EQ(namesOf(), "Brightness Gain Auto Exposure Privacy (after 0x00980900 (EINVAL))");
+  kernel->with(path, [](FakeNode& node) {
+    node.controls[1].describeProblem = 0;
+    return 0;
+  });
+  EXPECT_EQ(namesOf(), "Brightness Contrast Gain Auto Exposure Privacy ()");
+  kernel->with(path, [](FakeNode& node) {
+    node.controls.erase(node.controls.begin() + 3, node.controls.end());
+    return 0;
+  });
+  EXPECT_EQ(namesOf(), "Brightness Contrast Gain ()");
 }
 
 TEST(OpenedVideoNodeTest, AListThatCannotBeReadMayHaveAnyControl) {

@@ -109,8 +109,21 @@ void FrameDelivery::deliver(std::uint64_t frame) {
 void FrameDelivery::callHandler(std::uint64_t frame) {
   const std::chrono::nanoseconds time = frameTime(source_.run.rate, frame);
   PixelBuffer& buffer = pool_->take(source_.index, frame, attachment(frame), source_.traced, atTime(time));
-  (*source_.frames)(buffer, mediaTime(time));
+  (*source_.frames)(buffer, timeStamp(frame, time));
   buffer.release();
+}
+
+MediaTime FrameDelivery::timeStamp(std::uint64_t frame, std::chrono::nanoseconds time) const {
+  MediaTime stamp = mediaTime(time);
+  for (const TimeStampChange& change : source_.camera.delivery.timeStamps) {
+    if (frame < change.at) continue;
+    const std::uint64_t after = frame - change.at;
+    if (after != 0 && (change.every == 0 || after % change.every != 0)) continue;
+    constexpr Wide kMaximum = std::numeric_limits<std::int64_t>::max();
+    stamp.value = static_cast<std::int64_t>(std::min(Wide{stamp.value} + change.by.count(), kMaximum));
+    if (!change.isValid) stamp.flags &= ~MediaTime::kValid;
+  }
+  return stamp;
 }
 
 // By the phone's clock, saturated.

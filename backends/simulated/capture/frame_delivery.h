@@ -31,7 +31,7 @@ std::chrono::nanoseconds frameTime(MicroFrameRate rate, std::uint64_t frame);
 
 // Calls the handlers of a stream's output, on its own queues, from the stream's start to its stop: frame k at
 // frameTime(k), the scenario's events at their times. Presentation and event times are in nanoseconds since the
-// stream's start, independent of the time of the call.
+// stream's start, independent of the time of the call; the scenario's time stamps may differ from them.
 //
 // Thread: any. Handlers are called without any lock.
 class FrameDelivery final : public std::enable_shared_from_this<FrameDelivery> {
@@ -75,6 +75,7 @@ class FrameDelivery final : public std::enable_shared_from_this<FrameDelivery> {
   bool isDropped(std::uint64_t frame) const;
   std::chrono::nanoseconds arrival(std::uint64_t frame) const;
   std::optional<Value> attachment(std::uint64_t frame) const;
+  MediaTime timeStamp(std::uint64_t frame, std::chrono::nanoseconds time) const;
   std::chrono::nanoseconds atTime(std::chrono::nanoseconds sinceStart) const;
   std::chrono::nanoseconds sinceStart() const { return clock_->now() - source_.run.started; }
 

@@ -130,6 +130,24 @@ TEST_F(FrameDeliveryTest, DroppedFramesDoNotCome) {
   EXPECT_THAT(stream_->numbers(), ElementsAre(0, 3, 4));
 }
 
+TEST_F(FrameDeliveryTest, TimeStampsChangeForOneFrameOrEveryNth) {
+  make([](Camera& camera) {
+    camera.actualFrameRate = 10;
+    camera.delivery.timeStamps = {{1, 2, 5ms, true}, {3, 0, -150ms, true}, {4, 0, 0ms, false}};
+  });
+  ASSERT_TRUE(stream_->start());
+  pass(601ms);
+  std::vector<std::int64_t> milliseconds;
+  std::vector<std::uint32_t> flags;
+  for (const StreamUser::Frame& frame : stream_->frames()) {
+    milliseconds.push_back(frame.time.value / 1'000'000);
+    flags.push_back(frame.time.flags);
+  }
+  EXPECT_THAT(milliseconds, ElementsAre(100, 205, 300, 255, 500, 605));
+  EXPECT_THAT(flags, ElementsAre(1U, 1U, 1U, 1U, 0U, 1U));
+  EXPECT_EQ(stream_->frames()[3].arrived, 400ms);
+}
+
 TEST_F(FrameDeliveryTest, ABurstComesAtTheTimeOfItsLastFrame) {
   make([](Camera& camera) {
     camera.actualFrameRate = 10;

@@ -33,6 +33,15 @@ struct FrameBurst {
   std::uint64_t count = 1;
 };
 
+// A change to the time stamp of frame `at` and, unless `every` is 0, of every `every`th frame after it. The frames
+// themselves come when they are due.
+struct TimeStampChange {
+  std::uint64_t at = 0;
+  std::uint64_t every = 0;
+  std::chrono::nanoseconds by{0};  // what the time stamp is late by; negative: early
+  bool isValid = true;             // false: the frame has no time stamp
+};
+
 // An event on the output of the stream.
 struct CameraEvent {
   std::chrono::nanoseconds at{0};  // since the stream's start
@@ -42,6 +51,7 @@ struct CameraEvent {
 // The delivery of frames and events to the handlers of the output.
 struct DeliveryConfig {
   std::vector<FrameBurst> bursts;
+  std::vector<TimeStampChange> timeStamps;
   std::vector<CameraEvent> events;
   std::uint64_t framesAfterStop = 0;  // the number of frames delivered after stop() has returned
   std::uint64_t queues = 1;           // frame k is delivered by queue k modulo this; several queues deliver at once

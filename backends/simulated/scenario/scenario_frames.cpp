@@ -16,6 +16,7 @@ namespace {
 constexpr std::uint64_t kMaxCount = 1'000'000'000;
 constexpr std::uint64_t kMaxQueues = 64;
 constexpr double kLatest = 1e9;
+constexpr double kMaxStampChange = 86'400;  // seconds
 constexpr std::uint64_t kAnyCount = std::numeric_limits<std::uint64_t>::max();
 
 FrameAttachment readAttachment(const JsonCursor& cursor) {
@@ -38,6 +39,17 @@ void readMetadata(const JsonCursor& cursor, FrameMetadata& metadata) {
 
 std::chrono::nanoseconds readTime(const JsonCursor& cursor) {
   return nanosecondsFromSeconds(cursor.positiveNumber(kLatest));
+}
+
+TimeStampChange readTimeStampChange(const JsonCursor& cursor) {
+  cursor.allowKeys({"at", "every", "by", "valid"});
+  TimeStampChange change;
+  change.at = cursor.at("at").integer(0, kMaxCount);
+  if (const auto every = cursor.find("every")) change.every = every->integer(1, kMaxCount);
+  if (const auto by = cursor.find("by"))
+    change.by = nanosecondsFromSeconds(by->number(-kMaxStampChange, kMaxStampChange));
+  if (const auto valid = cursor.find("valid")) change.isValid = valid->boolean();
+  return change;
 }
 
 ReportChannelConfig readChannel(const JsonCursor& cursor) {
@@ -83,13 +95,16 @@ Projector readProjector(const JsonCursor& cursor) {
 }
 
 DeliveryConfig readDelivery(const JsonCursor& cursor) {
-  cursor.allowKeys({"bursts", "events", "framesAfterStop", "queues", "stopWaitsForHandlers"});
+  cursor.allowKeys({"bursts", "timeStamps", "events", "framesAfterStop", "queues", "stopWaitsForHandlers"});
   DeliveryConfig delivery;
   if (const auto bursts = cursor.find("bursts")) {
     for (const JsonCursor& burst : bursts->elements()) {
       burst.allowKeys({"at", "count"});
       delivery.bursts.push_back({burst.at("at").integer(0, kMaxCount), burst.at("count").integer(1, kMaxCount)});
     }
+  }
+  if (const auto changes = cursor.find("timeStamps")) {
+    for (const JsonCursor& change : changes->elements()) delivery.timeStamps.push_back(readTimeStampChange(change));
   }
   if (const auto events = cursor.find("events")) {
     for (const JsonCursor& event : events->elements()) {

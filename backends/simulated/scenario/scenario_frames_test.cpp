@@ -46,11 +46,19 @@ TEST(ScenarioFramesTest, AProjectorIsRead) {
 
 TEST(ScenarioFramesTest, ADeliveryIsRead) {
   const DeliveryConfig delivery = readText(readDelivery, R"({
-    "bursts": [{"at": 3, "count": 4}], "events": [{"at": 0.5, "number": -2147483648}],
+    "bursts": [{"at": 3, "count": 4}], "timeStamps": [{"at": 7, "every": 2, "by": -0.5}, {"at": 8, "valid": false}],
+    "events": [{"at": 0.5, "number": -2147483648}],
     "framesAfterStop": 5, "queues": 6, "stopWaitsForHandlers": false})");
   ASSERT_THAT(delivery.bursts, SizeIs(1));
   EXPECT_EQ(delivery.bursts[0].at, 3U);
   EXPECT_EQ(delivery.bursts[0].count, 4U);
+  ASSERT_THAT(delivery.timeStamps, SizeIs(2));
+  EXPECT_EQ(delivery.timeStamps[0].at, 7U);
+  EXPECT_EQ(delivery.timeStamps[0].every, 2U);
+  EXPECT_EQ(delivery.timeStamps[0].by, -500ms);
+  EXPECT_TRUE(delivery.timeStamps[0].isValid);
+  EXPECT_EQ(delivery.timeStamps[1].every, 0U);
+  EXPECT_FALSE(delivery.timeStamps[1].isValid);
   ASSERT_THAT(delivery.events, SizeIs(1));
   EXPECT_EQ(delivery.events[0].at, 500ms);
   EXPECT_EQ(delivery.events[0].number, -2147483648);

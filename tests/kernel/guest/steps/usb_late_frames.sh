@@ -1,7 +1,10 @@
 load_usb
-connect_cameras late_camera 2 --late-every 10 --late-by 25
+jitter=4
+connect_cameras punctual_camera 2
 probe_machine
-jitter=5
+judge_camera punctual
+disconnect_cameras punctual_camera
+connect_cameras late_camera 2 --late-every 10 --late-by 25
 judge_camera late
 jitter=
 disconnect_cameras late_camera
