@@ -34,7 +34,7 @@ void requireDay(const char* option, const std::optional<std::string>& day) {
 
 std::filesystem::path orUsual(const std::string& file) {
   if (!file.empty()) return file;
-  const std::filesystem::path usual = usualStore();
+  std::filesystem::path usual = usualStore();
   require(!usual.empty(), "--store FILE is required: neither XDG_DATA_HOME nor HOME says where the store is");
   return usual;
 }

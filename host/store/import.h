@@ -11,6 +11,7 @@
 #include <map>
 #include <set>
 #include <string>
+#include <tuple>
 #include <vector>
 
 namespace quazor {
@@ -46,7 +47,9 @@ class Importer {
     std::string day;
     std::string station;
 
-    friend auto operator<=>(const SummaryKey&, const SummaryKey&) = default;
+    friend bool operator<(const SummaryKey& a, const SummaryKey& b) {
+      return std::tie(a.characteristic, a.day, a.station) < std::tie(b.characteristic, b.day, b.station);
+    }
   };
 
   enum class Place { kFree, kTaken, kOfOther };

@@ -4,11 +4,11 @@
 #include "contract/ordered_map.h"
 #include "host/record/record_file.h"
 
-#include <compare>
 #include <cstdint>
 #include <filesystem>
 #include <optional>
 #include <string>
+#include <tuple>
 #include <vector>
 
 namespace quazor {
@@ -24,7 +24,10 @@ struct Characteristic {
   bool upperOpen = false;
   std::string limits{};  // of the user, in their canonical texts, separated by "; "
 
-  friend auto operator<=>(const Characteristic&, const Characteristic&) = default;
+  friend bool operator<(const Characteristic& a, const Characteristic& b) {
+    return std::tie(a.diagnostic, a.name, a.unit, a.lower, a.upper, a.lowerOpen, a.upperOpen, a.limits) <
+           std::tie(b.diagnostic, b.name, b.unit, b.lower, b.upper, b.lowerOpen, b.upperOpen, b.limits);
+  }
 };
 
 struct ResultRow {

@@ -92,6 +92,7 @@ void printTable(std::ostream& out, const AnswerTable& table) {
   shown.addHeader(names);
   for (const auto& row : table.rows) {
     std::vector<std::string> cells;
+    cells.reserve(row.size());
     for (const AnswerCell& cell : row) cells.push_back(std::visit(ToText(), cell));
     shown.addRow(std::move(cells));
   }
