@@ -6,22 +6,67 @@
 #include "host/report/page/frames_section.h"
 #include "host/report/page/html.h"
 #include "host/report/page/run_facts.h"
+#include "host/report/page/shown_number.h"
 #include "host/report/record_difference.h"
 #include "host/text/table.h"
 
 #include <algorithm>
+#include <charconv>
+#include <cmath>
 #include <cstddef>
 #include <optional>
+#include <string_view>
+#include <system_error>
 #include <vector>
 
 namespace quazor {
 
 namespace {
 
-// A value of one of the runs, or that it lacks what the other has.
-std::string valueCell(const std::optional<std::string>& value) {
+constexpr double kLeastAccuracy = 100;  // of a difference, compared with its error
+
+// The number at the beginning of "29.97 frames/s", and what follows it.
+struct LeadingNumber {
+  double number = 0;
+  std::string rest;
+};
+
+std::optional<LeadingNumber> leadingNumber(const std::optional<std::string>& text) {
+  if (!text) return std::nullopt;
+  LeadingNumber found;
+  const char* const end = text->data() + text->size();
+  const auto [rest, problem] = std::from_chars(text->data(), end, found.number);
+  if (problem != std::errc() || (rest != end && *rest != ' ')) return std::nullopt;
+  found.rest.assign(rest, end);
+  return found;
+}
+
+// All numbers in the text; those of limits are among them.
+std::vector<double> numbersIn(std::string_view text) {
+  std::vector<double> numbers;
+  while (!text.empty()) {
+    double number = 0;
+    const auto [rest, problem] = std::from_chars(text.data(), text.data() + text.size(), number);
+    if (problem == std::errc()) numbers.push_back(number);
+    text.remove_prefix(std::max<std::size_t>(static_cast<std::size_t>(rest - text.data()), 1));
+  }
+  return numbers;
+}
+
+// A value of one of the runs, or that it lacks what the other has. A rounded number is accurate to a hundredth of the
+// difference, and stays on its side of the limits that follow it.
+std::string valueCell(const std::optional<std::string>& value, const std::optional<std::string>& other) {
   if (!value) return "<td><em>not there</em></td>";
-  return element("td class=\"line\"", value->empty() ? "there" : htmlText(*value));
+  if (value->empty()) return "<td class=\"line\">there</td>";
+  const std::optional<LeadingNumber> number = leadingNumber(value);
+  const std::optional<LeadingNumber> otherNumber = leadingNumber(other);
+  if (!number || !otherNumber) return element("td class=\"line\"", htmlText(*value));
+  std::vector<double> thresholds = numbersIn(number->rest);
+  const double error = std::abs(number->number - otherNumber->number) / kLeastAccuracy;
+  thresholds.insert(thresholds.end(), {number->number - error, number->number + error});
+  const std::string shown = shownNumber(number->number, thresholds) + number->rest;
+  const std::string title = shown == *value ? std::string() : " title=\"" + htmlText(*value) + "\"";
+  return element("td class=\"line\"" + title, htmlText(shown));
 }
 
 std::string differenceTable(const std::vector<Difference>& differences) {
@@ -30,7 +75,7 @@ std::string differenceTable(const std::vector<Difference>& differences) {
     std::string what = one.what.empty() ? "the diagnostic" : one.what;
     if (what.ends_with(',')) what.pop_back();
     rows += element("tr", element("th scope=\"row\"", htmlName(one.name)) + element("td", htmlText(what)) +
-                              valueCell(one.before) + valueCell(one.after));
+                              valueCell(one.before, one.after) + valueCell(one.after, one.before));
     rows += "\n";
   }
   return "<div class=\"scroll\" tabindex=\"0\" role=\"region\" aria-label=\"Differences\"><table><caption>What differs "

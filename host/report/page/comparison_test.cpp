@@ -39,6 +39,24 @@ TEST(ComparisonPage, HasBothValuesOfWhatDiffers) {
   EXPECT_THAT(comparisonPage({before, ""}, {after, ""}, false), Not(HasSubstr("<h3>A: stream wide</h3>")));
 }
 
+TEST(ComparisonPage, RoundsNumbersButNotTheirDifference) {
+  const auto pageWith = [](double before, double after) {
+    std::vector<RecordedRun> runs;
+    for (const double value : {before, after}) {
+      DiagnosticRecord record = recordOf("A", Verdict::kPass);
+      record.measuredResults = judgeResults({resultWithMinimum(value, 90)});
+      runs.push_back(runWith({record}, 33'000'000));
+    }
+    return comparisonPage({runs[0], "a.jsonl"}, {runs[1], "b.jsonl"}, true);
+  };
+  EXPECT_THAT(pageWith(95.123456789, 96),
+              HasSubstr("<td class=\"line\" title=\"95.123456789 frames, Enough: &gt;= 90, pass\">95.1235 frames, "
+                        "Enough: &gt;= 90, pass</td><td class=\"line\">96 frames, Enough: &gt;= 90, pass</td>"));
+  EXPECT_THAT(pageWith(95.123456789, 95.123456788),
+              HasSubstr("<td class=\"line\">95.123456789 frames, Enough: &gt;= 90, pass</td>"));
+  EXPECT_THAT(pageWith(89.99999999, 96), HasSubstr(">89.99999999 frames, Enough: &gt;= 90, fail</td>"));
+}
+
 TEST(ComparisonPage, SaysThatNothingDiffers) {
   const RecordedRun run = runWith({recordOf("A", Verdict::kPass)}, 33'000'000);
   const std::string page = comparisonPage({run, "a.jsonl"}, {run, "a.jsonl"}, true);
