@@ -32,6 +32,17 @@ std::vector<Profile> profilesIn(const std::filesystem::path& file, const Install
   return profiles;
 }
 
+bool namesOnlyPlugins(const Options& options) { return !options.plugins.empty() && options.names.empty(); }
+
+std::string whyNothingWasTested(const Options& options) {
+  if (namesOnlyPlugins(options)) {
+    return "no installed phone expects anything of what --plugin names; name the files of phones that do, as in "
+           "'quazor "
+           "selftest phones/*.json --plugin FILE'";
+  }
+  return R"(no phone has an expected outcome; say it in the phone's file, as in "expect": {"DIAGNOSTIC": {"verdict": "fail"}})";
+}
+
 // Like wantedScenarios(); bindings come last, each once.
 std::vector<std::string> wantedPhones(const std::vector<std::string>& names, const Installation& installation) {
   std::vector<std::string> simulated;
@@ -91,7 +102,8 @@ class Selftest {
  public:
   // `signals` is null if the diagnostics run in this process.
   Selftest(const Options& options, const Installation& installation, Console& console, WatchedSignals* signals)
-      : options_(withAllPlugins(options, installation)),
+      : isForNamedPlugins_(namesOnlyPlugins(options)),
+        options_(withAllPlugins(options, installation)),
         installation_(installation),
         scan_(scanOf(
             options_, installation, [](const std::vector<Diagnostic>& all) { return all; }, signals)),
@@ -151,6 +163,7 @@ class Selftest {
       try {
         ScenarioSummary summary =
             binding ? summaryOfBinding(file) : summaryOfScenario(file, installation_.scenarioSource());
+        if (isForOthers(summary)) continue;
         leaveOutInherited(summary, file);
         if (!summary.expected.empty()) phones.push_back({name, file, std::move(summary), binding.has_value()});
       } catch (const InputError& problem) {
@@ -168,6 +181,13 @@ class Selftest {
   // no fault; empty if there is none.
   std::filesystem::path healthyFor(const WantedPhone& phone) const {
     return phone.isReal ? healthyMachine_ : installation_.defaultScenario();
+  }
+
+  // With --plugin and no name of a phone, only the phones of these plug-ins are meant.
+  bool isForOthers(const ScenarioSummary& summary) const {
+    return isForNamedPlugins_ && scan_.failed.empty() &&
+           std::none_of(summary.expected.begin(), summary.expected.end(),
+                        [this](const ExpectedOutcome& one) { return findLoaded(one) != nullptr; });
   }
 
   // Whoever bases a phone on another one need not load the diagnostics of that one: removes what is expected of
@@ -421,6 +441,7 @@ class Selftest {
     return recordOfRun(described, parameters, runOptions, seed, isolation_, signals_);
   }
 
+  const bool isForNamedPlugins_;
   const Options options_;
   const Installation& installation_;
   const PluginScan scan_;
@@ -443,9 +464,7 @@ ExitCode selftestCommand(const Options& options, const Installation& installatio
   const std::string refusal = formatMessage("%@ of %@ phones were refused", refused, outcome.wanted + refused);
   if (outcome.rows.empty()) {
     if (!outcome.isComplete()) throw CommandError(ExitCode::kInterrupted, "interrupted before any phone was tested");
-    const std::string why = refused == 0 ? "no phone has an expected outcome; say it in the phone's file, as in "
-                                           "\"expect\": {\"DIAGNOSTIC\": {\"verdict\": \"fail\"}}"
-                                         : refusal;
+    const std::string why = refused == 0 ? whyNothingWasTested(options) : refusal;
     throw CommandError(ExitCode::kCannotRead, "nothing was tested: " + why);
   }
   std::ostringstream text = textFor(options.report, console);

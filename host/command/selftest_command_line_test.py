@@ -282,6 +282,17 @@ class PhonesOfAUserTest(CommandLineTest):
         self.assert_refused(quazor("selftest", bare), 66, "no phone has an expected outcome; say it in the phone's file, as in "
                             '"expect": {"DIAGNOSTIC": {"verdict": "fail"}}')
 
+    def test_a_plug_in_alone_means_the_phones_that_expect_something_of_it(self):
+        result = quazor("selftest", "--plugin", EXAMPLE, "--seeds", "1")
+        self.assert_refused(result, 66, "no installed phone expects anything of what --plugin names", "phones/*.json")
+        self.assertNotIn("REFUSED", result.stderr)
+        folder = self.directory / "data/quazor/scenarios/mine"
+        folder.mkdir(parents=True)
+        self.on_healthy("good.json").rename(folder / "good.json")
+        result = self.selftest(env={"XDG_DATA_HOME": str(self.directory / "data")})
+        self.assertEqual(result.returncode, 0, result.stderr)
+        self.assertEqual([row["phone"] for row in json.loads(result.stdout)["rows"]], ["mine/good"])
+
     def test_the_table_of_runs_counts_what_each_profile_detects(self):
         result = quazor("selftest", "healthy", DROPPED, REFUSED, "--seeds", "1")
         row = next(line for line in result.stdout.splitlines() if line.startswith(f"{BACK} "))

@@ -239,8 +239,8 @@ TEST(SelftestCommand, IsRefusedWhereNothingIsTested) {
   Console console{out, err};
   EXPECT_EQ(runProgram({"selftest", "--plugin", testPlugin("working")}, installation, console), ExitCode::kCannotRead);
   EXPECT_EQ(err.str(),
-            "quazor: nothing was tested: no phone has an expected outcome; say it in the phone's file, as in "
-            "\"expect\": {\"DIAGNOSTIC\": {\"verdict\": \"fail\"}}\n");
+            "quazor: nothing was tested: no installed phone expects anything of what --plugin names; name the files of "
+            "phones that do, as in 'quazor selftest phones/*.json --plugin FILE'\n");
   EXPECT_EQ(out.str(), "");
 }
 

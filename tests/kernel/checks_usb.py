@@ -105,10 +105,13 @@ def usb_twins(step):
     expect("USB interface 2" in step.out("probe"), "the probe does not tell the second camera's interface")
     nodes = [camera["node"].get("usbInterface") for camera in json.loads(step.text("front.json"))["cameras"].values()]
     expect_equal("the interfaces of both cameras", nodes, [0, 2])
-    cameras.healthy_run(step, "front", cameras.FRONT, 2.015)
+    front = cameras.healthy_run(step, "front", cameras.FRONT, 2.015)
     healthy_camera(step, "second")
     (device,) = activity(step, "twins")
     expect_equal("the streams", [function["streams"] for function in device["functions"]], [1, 2])
+    came = [cameras.frames_of(front, "Front"), results_of(step, "second")["Frames"]]  # in the last stream of each
+    sent = [function["frames"] for function in device["functions"]]
+    expect(all(0 <= one - other <= 1 for one, other in zip(sent, came)), f"{sent} frames were sent, {came} came")
     entry = step.passed("leaving")
     for camera in cameras.FRONT:
         expect(15 <= cameras.frames_of(entry, camera) <= 20, f"{cameras.frames_of(entry, camera)} frames, not 20")
