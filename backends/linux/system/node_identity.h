@@ -1,7 +1,7 @@
 // NodeIdentity: tells a device from another one that took its place.
 #pragma once
 
-#include "contract/contract.h"
+#include "contract/diagnostic_error.h"
 
 #include <cstdint>
 #include <filesystem>
