@@ -157,7 +157,11 @@ function(quazor_test_program name)
   target_link_libraries(${name} PRIVATE ${ARG_DEPENDS})
   quazor_configure(${name})
   quazor_compile_quickly(${name})
-  quazor_precompile(${name} program ${QUAZOR_COMMON_HEADERS} <nlohmann/json.hpp>)
+  # The definitions of host/ would be part of headers that others reuse.
+  file(RELATIVE_PATH folder ${PROJECT_SOURCE_DIR} ${CMAKE_CURRENT_SOURCE_DIR})
+  if(NOT folder MATCHES "^host")
+    quazor_precompile(${name} program ${QUAZOR_COMMON_HEADERS} <nlohmann/json.hpp>)
+  endif()
   set_target_properties(${name} PROPERTIES RUNTIME_OUTPUT_DIRECTORY ${PROJECT_BINARY_DIR}/tests)
 endfunction()
 
