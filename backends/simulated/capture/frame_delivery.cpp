@@ -108,8 +108,10 @@ void FrameDelivery::deliver(std::uint64_t frame) {
 
 void FrameDelivery::callHandler(std::uint64_t frame) {
   const std::chrono::nanoseconds time = frameTime(source_.run.rate, frame);
-  PixelBuffer& buffer = pool_->take(source_.index, frame, attachment(frame), source_.traced, atTime(time));
-  (*source_.frames)(buffer, timeStamp(frame, time));
+  const MediaTime stamp = timeStamp(frame, time);
+  const std::chrono::nanoseconds told = atTime(std::chrono::nanoseconds(stamp.value));
+  PixelBuffer& buffer = pool_->take(source_.index, frame, attachment(frame), source_.traced, told);
+  (*source_.frames)(buffer, stamp);
   buffer.release();
 }
 
