@@ -7,7 +7,7 @@ In every Markdown document below PREFIX, and in the manual pages:
 
   - A relative link leads to an installed file, and its anchor to a heading of that file.
   - A file or folder of the source tree that a text names in `back quotes`, or an excerpt comes from, is installed: headers
-    in include/quazor, documents and examples in share/doc. A path below /usr is one below PREFIX. A file of `data` is
+    in include/quazor, documents, examples and some sources in share/doc. A path below /usr is one below PREFIX. A file of `data` is
     elsewhere in an installation, in share/quazor, and so is named by that path or by a command that lists it.
     What a source tree alone has may be named in a paragraph that speaks of the "source tree", and in all of a document whose
     first paragraph does.
@@ -32,8 +32,9 @@ HEADING = re.compile(r"^#{1,6}\s+(.*?)\s*#*$")
 INSTALLED = {
     "contract": "include/quazor/contract", "platform": "include/quazor/platform",
     "docs": "share/doc/quazor", "examples": "share/doc/libquazor-dev/examples", "share": "share",
+    "diagnostics": "share/doc/libquazor-dev/source/diagnostics", "plugins": "share/doc/libquazor-dev/source/plugins",
 }
-TREE_ONLY = ("backends", "base", "benchmarks", "cmake", "data", "diagnostics", "host", "packaging", "plugins", "tests")
+TREE_ONLY = ("backends", "base", "benchmarks", "cmake", "data", "host", "packaging", "tests")
 INDEX = "share/doc/quazor/index.md"
 SAID = "source tree"
 PATH = re.compile(r"^/?[\w.*-]+(/[\w.*-]*)+$")
