@@ -181,7 +181,8 @@ void addVerbose(CLI::App& command, RawOptions& raw) {
 void addLimits(CLI::App& command, RawOptions& raw) {
   addRepeatable(command, "--limit", raw.limits,
                 "Also judge results by this limit, such as 'BackTele.Total >= 90', '*.FrameOffset in [-2, 2]' or "
-                "'A.Total == B.Total +- 1'; repeatable. It can only make a verdict stricter",
+                "'A.Total == B.Total +- 1'; repeatable. It cannot relax a diagnostic's own limits; an analysis has it "
+                "in place of the record's on the same results",
                 "[DIAGNOSTIC:]RESULT OP NUMBER [UNIT] [+- TOLERANCE]");
 }
 

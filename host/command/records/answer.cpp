@@ -1,13 +1,14 @@
 #include "host/command/records/answer.h"
 
+#include "contract/message_format.h"
 #include "host/record/value_json.h"
 #include "host/report/csv_report.h"
+#include "host/text/number_text.h"
 #include "host/text/table.h"
 
 #include <nlohmann/json.hpp>
 
 #include <algorithm>
-#include <charconv>
 #include <cmath>
 #include <cstdio>
 
@@ -19,17 +20,6 @@ using Json = nlohmann::ordered_json;
 
 constexpr int kShownDigits = 5;
 
-// The shortest text that reads back as the number.
-std::string exactText(double number) {
-  char text[32];
-  return {text, std::to_chars(std::begin(text), std::end(text), number).ptr};
-}
-
-std::string shownText(double number) {
-  char text[32];
-  return {text, std::to_chars(std::begin(text), std::end(text), number, std::chars_format::general, kShownDigits).ptr};
-}
-
 struct ToJson {
   Json operator()(std::monostate) const { return nullptr; }
   Json operator()(std::int64_t number) const { return number; }
@@ -40,14 +30,14 @@ struct ToJson {
 struct ToCsv {
   std::string operator()(std::monostate) const { return {}; }
   std::string operator()(std::int64_t number) const { return std::to_string(number); }
-  std::string operator()(double number) const { return exactText(number); }
+  std::string operator()(double number) const { return defaultText(number); }
   std::string operator()(const std::string& text) const { return csvField(textCell(text)); }
 };
 
 struct ToText {
   std::string operator()(std::monostate) const { return {}; }
   std::string operator()(std::int64_t number) const { return std::to_string(number); }
-  std::string operator()(double number) const { return shownText(number); }
+  std::string operator()(double number) const { return significantDigits(number, kShownDigits); }
   std::string operator()(const std::string& text) const { return printable(text); }
 };
 

@@ -10,18 +10,12 @@
 #include "host/text/table.h"
 
 #include <algorithm>
-#include <charconv>
 #include <iterator>
 #include <map>
 
 namespace quazor {
 
 namespace {
-
-std::string numberText(double number) {
-  char text[32];
-  return {text, std::to_chars(std::begin(text), std::end(text), number).ptr};
-}
 
 Summary totalOf(const std::vector<DaySummary>& days) {
   Summary total;
@@ -81,8 +75,8 @@ AnswerTable daysTable(const Series& series) {
 
 std::string limitText(const Characteristic& of) {
   if (!of.lower && !of.upper) return {};
-  return (of.lower ? (of.lowerOpen ? "(" : "[") + numberText(*of.lower) : "(") + ", " +
-         (of.upper ? numberText(*of.upper) + (of.upperOpen ? ")" : "]") : ")");
+  return (of.lower ? (of.lowerOpen ? "(" : "[") + defaultText(*of.lower) : "(") + ", " +
+         (of.upper ? defaultText(*of.upper) + (of.upperOpen ? ")" : "]") : ")");
 }
 
 Answer failuresAnswer(Database& store, const Filter& filter) {

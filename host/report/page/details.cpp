@@ -2,6 +2,7 @@
 
 #include "host/report/page/html.h"
 #include "host/report/page/shown_number.h"
+#include "host/text/number_text.h"
 #include "host/text/table.h"
 #include "host/text/timestamp.h"
 

@@ -1,6 +1,7 @@
 #include "host/report/page/html.h"
 
 #include "host/text/display_width.h"
+#include "host/text/number_text.h"
 #include "host/text/table.h"
 #include "host/text/xml_text.h"
 
@@ -11,12 +12,6 @@ namespace quazor {
 namespace {
 
 constexpr std::size_t kMaxNameWidth = 160;  // columns
-
-std::string digitsOf(double value, std::chars_format format, int precision) {
-  char digits[512];  // enough for the largest number
-  const auto [end, ignored] = std::to_chars(std::begin(digits), std::end(digits), value, format, precision);
-  return {digits, end};
-}
 
 }  // namespace
 
@@ -74,12 +69,12 @@ std::string wholeName(std::string_view name) {
 }
 
 std::string coordinate(double value) {
-  std::string text = digitsOf(value, std::chars_format::fixed, 1);
+  char digits[512];  // enough for the largest number
+  const auto [end, ignored] = std::to_chars(std::begin(digits), std::end(digits), value, std::chars_format::fixed, 1);
+  std::string text(digits, end);
   if (text.ends_with(".0")) text.erase(text.size() - 2);
   return text == "-0" ? "0" : text;
 }
-
-std::string significantDigits(double value, int digits) { return digitsOf(value, std::chars_format::general, digits); }
 
 std::string roundedText(double value) { return significantDigits(value, 6); }
 

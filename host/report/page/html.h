@@ -36,9 +36,6 @@ std::string wholeName(std::string_view name);
 // "1.5": with at most one decimal, for coordinates.
 std::string coordinate(double value);
 
-// A finite number with that many significant digits.
-std::string significantDigits(double value, int digits);
-
 // A number with six significant digits, for what was calculated from results.
 std::string roundedText(double value);
 

@@ -1,6 +1,7 @@
 #include "host/report/page/plot.h"
 
 #include "host/report/page/html.h"
+#include "host/text/number_text.h"
 
 #include <algorithm>
 #include <cmath>

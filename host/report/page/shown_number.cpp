@@ -2,6 +2,7 @@
 
 #include "contract/message_format.h"
 #include "host/report/page/html.h"
+#include "host/text/number_text.h"
 
 #include <algorithm>
 #include <charconv>
