@@ -5,16 +5,36 @@ say() { printf '%s\n' "$*" >&2; }
 # Build directories are below build/ in the checkout, or below QUAZOR_BUILD_DIR if it is set.
 build_root=${QUAZOR_BUILD_DIR:-$root/build}
 
+# Debian's packages of what the program is built with and uses.
+program_packages=(g++ cmake ninja-build libcli11-dev libsqlite3-dev nlohmann-json3-dev libjs-dygraphs)
+
 # install_packages PACKAGE...: installs missing packages on Debian and derivatives, after printing their names.
 install_packages() {
   if ! command -v dpkg-query >/dev/null 2>&1 || ! command -v apt-get >/dev/null 2>&1; then
     say "This is not a Debian system: if the build fails, install the equivalents of these Debian packages: $*"
     return 0
   fi
-  local missing=() package
+  local missing lock
+  find_missing "$@"
+  [ ${#missing[@]} -gt 0 ] || return 0
+  exec {lock}<"$root/cmake/setup.sh"
+  flock "$lock"  # apt-get refuses to run twice at once
+  find_missing "$@"
+  install_missing || return 1
+  exec {lock}>&-
+}
+
+# find_missing PACKAGE...: sets `missing` to those that are not installed.
+find_missing() {
+  local package
+  missing=()
   for package in "$@"; do
     [ "$(dpkg-query -W -f='${db:Status-Status}' "$package" 2>/dev/null)" = installed ] || missing+=("$package")
   done
+}
+
+# install_missing: installs `missing`, which another run of a script may have done meanwhile.
+install_missing() {
   [ ${#missing[@]} -gt 0 ] || return 0
   say "Installing with apt-get: ${missing[*]}"
   local sudo=()

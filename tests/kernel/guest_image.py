@@ -75,13 +75,15 @@ def module_archive(module):
 def project_archive(directory):
     """The project of a build as installed under /usr, the rig's own programs and the steps, as bytes."""
     archive = Archive()
+    programs = [path for path in sorted((directory / GUEST_PROGRAMS).glob("*")) if path.is_file() and os.access(path, os.X_OK)]
+    if not programs:
+        raise BuildProblem(f"{directory} has no programs for the guest: run without --no-build")
     with tempfile.TemporaryDirectory() as scratch:
         for component in ("program", "plugins"):
             checked("cmake", "--install", directory, "--prefix", scratch, "--component", component)
         add_installed(archive, pathlib.Path(scratch))
-    for program in sorted((directory / GUEST_PROGRAMS).iterdir()):
-        if program.is_file() and os.access(program, os.X_OK):
-            add_program(archive, f"/usr/bin/{program.name}", program)
+    for program in programs:
+        add_program(archive, f"/usr/bin/{program.name}", program)
     archive.add("/rig/channels", channels_of(HERE.parent.parent / "data/scenarios/healthy.json").encode(), 0o644)
     archive.add("/etc/passwd", b"root::0:0::/:/bin/sh\nnobody::65534:65534::/:/bin/sh\n", 0o644)
     archive.add_file("/init", HERE / "guest/init")

@@ -177,6 +177,7 @@ def arguments():
                         help="run the steps also with this build, made with address and undefined-behaviour sanitizers")
     parser.add_argument("--thorough", action="store_true", help="run the long steps, too")
     parser.add_argument("--no-build", action="store_true", help="take the builds as they are")
+    parser.add_argument("--prepare", action="store_true", help="make everything that the steps need, and run none")
     parser.add_argument("--shell", metavar="COMMAND", help="run only this command in the guest, with all devices")
     parser.add_argument("--list", action="store_true", help="list the steps")
     parser.add_argument("steps", nargs="*", metavar="STEP", help="steps to run (default: all)")
@@ -201,14 +202,17 @@ def main():
     kernel = find_kernel(cache_directory(ROOT / "build"), say)
     if options.shell is not None:
         return shell(options.shell, directory, kernel)
-    say(f"{kernel.name}; {time.monotonic() - began:.1f} s until here")
     steps = chosen_steps(options.steps, options.thorough)
+    vimc = find_vimc(kernel, say) if any(step.needs_vimc for step in steps) else None
+    say(f"{kernel.name}; {time.monotonic() - began:.1f} s until here")
+    if options.prepare:
+        return 0
     if not options.steps and len(steps) < len(STEPS):
         left_out = ", ".join(step.name for step in STEPS if step not in steps)
         say(f"left out: {left_out} (--thorough runs them)")
     system = system_archive(kernel)
-    if any(step.needs_vimc for step in steps):
-        system += module_archive(find_vimc(kernel, say))
+    if vimc is not None:
+        system += module_archive(vimc)
     plans = plans_of(steps, "boot", [system, project_archive(directory)], MEMORY, 1)
     if options.sanitized:
         long = [step.name for step in steps if step.soak and step.name not in options.steps]
