@@ -49,11 +49,13 @@ def error_of(error):
 def differences(expected, outcome):
     """The differences between an outcome and the scenario's expectation, as sentences."""
     error = outcome["error"]
-    if error is not None and error["domain"] == HOST_DOMAIN and "error" not in expected:
+    wanted = expected.get("error")
+    if error is not None and error["domain"] == HOST_DOMAIN and wanted == "none":
         error = None  # the host's own error for a run that reported none
+    is_any = wanted is None and expected["verdict"] == "error"
     pairs = {
         "verdict": (expected["verdict"], outcome["verdict"]),
-        "error": (expected.get("error"), error_of(error)),
+        "error": (None, None) if is_any else (None if wanted == "none" else wanted, error_of(error)),
         "failed results": (
             expected.get("failedResults", []),
             [result["name"] for result in outcome.get("measuredResults", []) if result["verdict"] == "fail"],

@@ -1,6 +1,8 @@
 #include "host/command/commands.h"
 
+#include "base/text/name_list.h"
 #include "contract/message_format.h"
+#include "host/command/expectations.h"
 #include "host/command/explanations.h"
 #include "host/command/plugin_review.h"
 #include "host/command/selection.h"
@@ -54,6 +56,7 @@ class Doctor {
       check("plug-in", plugin.string(), [&] { return findingOfPlugin(plugin); });
     }
     checkHiddenPlugins();
+    areAllLoaded_ = allFine_ && installation_.hiddenPlugins().empty();
     checkProfiles();
     checkPhones();
     check("explanations", installation_.explanations().back().string(),
@@ -135,8 +138,6 @@ class Doctor {
       const std::filesystem::path file = installation_.namedProfile(name);
       if (file != byDefault) files.push_back(file);
     }
-    // A plug-in that was refused or is hidden may have what an entry is for.
-    const bool allLoaded = allFine_ && installation_.hiddenPlugins().empty();
     for (const std::filesystem::path& file : files) {
       Profile read;
       bool hidesDefault = false;
@@ -149,7 +150,7 @@ class Doctor {
                countText(read.experiments.size(), "experiment") + (file == byDefault ? "; the default profile" : "");
       });
       if (hidesDefault) remark("profile", file.string(), std::string("it ") + kHidesDefaultProfile);
-      if (allLoaded) remarkUnusedEntries(read);
+      if (areAllLoaded_) remarkUnusedEntries(read);
     }
   }
 
@@ -161,7 +162,7 @@ class Doctor {
     });
     for (const std::string& name : names) {
       try {
-        summaryOfScenario(installation_.scenario(name), installation_.scenarioSource());
+        remarkUnknownExpectations(name);
       } catch (const InputError& problem) {
         tell(false, "phone", name, problem.what());
       }
@@ -171,6 +172,21 @@ class Doctor {
       phonesOfScenario(installation_.defaultScenario(), true, 0, installation_.scenarioSource())();
       return std::string("created the healthy phone");
     });
+  }
+
+  // Reads the phone, and remarks what it expects of a diagnostic that may have been removed.
+  void remarkUnknownExpectations(const std::string& name) {
+    const std::filesystem::path file = installation_.scenario(name);
+    const ScenarioSummary summary = summaryOfScenario(file, installation_.scenarioSource());
+    if (!areAllLoaded_) return;
+    std::vector<std::string> unknown;
+    for (const ExpectedOutcome& one : summary.expected) {
+      if (diagnosticOf(catalogue_, one) == nullptr && isNamedIn(file, one)) unknown.push_back(one.name);
+    }
+    if (unknown.empty()) return;
+    remark("phone", file.string(),
+           "it expects something of " + listText(unknown) +
+               ", which no installed plug-in has; if the plug-in was removed, remove the phone, too");
   }
 
   void checkBindings() {
@@ -206,6 +222,7 @@ class Doctor {
   const Installation& installation_;
   Console& console_;
   std::vector<DescribedDiagnostic> catalogue_;  // of all plug-ins that could be loaded
+  bool areAllLoaded_ = false;  // or else a plug-in that was refused or is hidden may have what a file names
   bool allFine_ = true;
 };
 

@@ -286,7 +286,7 @@ class PluginReview {
     if (unexplained.empty()) return;
     tell(Rating::kAdvice, "explanations",
          formatMessage("none of %@; write explanations/%@.json beside the plug-in and install it "
-                       "(docs/explanations.md)",
+                       "(explanations.md in share/doc/quazor)",
                        listText(unexplained), plugin_.stem().string()));
   }
 

@@ -19,7 +19,7 @@ namespace quazor {
 
 namespace {
 
-constexpr std::size_t kMaxName = 48;      // a table of results has room for it in 80 columns
+constexpr std::size_t kMaxLetters = 48;      // a table of results has room for it in 80 columns
 constexpr std::size_t kMaxSummary = 160;  // two lines of a terminal
 constexpr std::size_t kMaxListed = 5;     // names in one finding
 constexpr std::chrono::milliseconds kMaxTime{500};
@@ -130,10 +130,10 @@ ReviewFindings reviewName(std::string_view kind, const std::string& name) {
                                       "put the word %@ into it",
                                       name, kind.starts_with('D') ? "" : "n", withSmallLetters(kind), kind)});
   }
-  if (widthOf(name) > kMaxName) {
+  if (widthOf(name) > kMaxLetters) {
     findings.push_back({Rating::kAdvice, subject,
                         formatMessage("'%@' has %@ characters; more than %@ do not fit into a report of 80 columns",
-                                      name, widthOf(name), kMaxName)});
+                                      name, widthOf(name), kMaxLetters)});
   }
   return findings;
 }
@@ -268,7 +268,7 @@ ReviewFindings reviewResults(const DiagnosticRecord& record,
   if (!unexplained.empty()) {
     findings.push_back({Rating::kAdvice, record.name,
                         formatMessage("if %@ %@, 'quazor explain' has no answer; write explanations "
-                                      "(docs/explanations.md)",
+                                      "(explanations.md in share/doc/quazor)",
                                       listed(unexplained), unexplained.size() == 1 ? "fails" : "fail")});
   }
   return findings;

@@ -121,8 +121,10 @@ std::string differenceOf(const ExpectedOutcome& expected, const DiagnosticRecord
   const DiagnosticErrorPtr error = hostsWord ? nullptr : record.error;
   std::vector<Comparison> comparisons = {
       {"the verdict", expected.verdict, std::string(nameOf(record.verdict))},
-      {"the error", errorText(expected.error), errorText(partsOf(error))},
       {"the failed results", namesText(expected.failedResults), namesText(failedResultsOf(record))}};
+  if (!expected.mayBeAnyError) {
+    comparisons.insert(comparisons.begin() + 1, {"the error", errorText(expected.error), errorText(partsOf(error))});
+  }
   if (expected.underlying) {
     const DiagnosticErrorPtr underlying = error == nullptr ? nullptr : error->underlyingError();
     comparisons.push_back({"the underlying error", errorText(expected.underlying), errorText(partsOf(underlying))});
@@ -237,6 +239,8 @@ void printSelftest(std::ostream& out, const SelftestOutcome& outcome) {
   } else {
     out << formatMessage("NOT as the phone expects: %@ of %@ runs\n", differing, rows.size());
   }
+  for (const RefusedPhone& one : outcome.notJudged)
+    printWrapped(out, "Not judged: " + one.name + ": " + one.reason, "", "  ");
   if (!outcome.refused.empty()) {
     const std::size_t refused = outcome.refused.size();
     out << formatMessage("Refused: %@ of %@ phones\n", refused, outcome.wanted + refused);
@@ -267,6 +271,8 @@ Json selftestDocument(const SelftestOutcome& outcome) {
   }
   Json refused = Json::array();
   for (const RefusedPhone& one : outcome.refused) refused.push_back({{"phone", one.name}, {"reason", one.reason}});
+  Json notJudged = Json::array();
+  for (const RefusedPhone& one : outcome.notJudged) notJudged.push_back({{"phone", one.name}, {"reason", one.reason}});
   Json unusedLimits = Json::array();
   for (const UnusedLimit& one : outcome.unusedLimits) {
     unusedLimits.push_back({{"profile", one.profile}, {"problem", one.problem}});
@@ -279,6 +285,7 @@ Json selftestDocument(const SelftestOutcome& outcome) {
           {"totals", totalsJson(totalsOf(outcome.phones))},
           {"phones", detectionsJson(outcome.phones)},
           {"refused", std::move(refused)},
+          {"notJudged", std::move(notJudged)},
           {"unusedLimits", std::move(unusedLimits)},
           {"rows", std::move(json)}};
 }

@@ -55,7 +55,8 @@ std::vector<SelftestVerdict> verdictsOf(const std::vector<SelftestRow>& rows);
 // True if every row is kPassed or kDetected.
 bool allPassed(const std::vector<SelftestVerdict>& verdicts);
 
-// A phone that was not run, because its file has a mistake or expects something of a diagnostic that is not loaded.
+// A phone that was not run: refused, because its file has a mistake, or not judged, because it only expects something
+// of what is not loaded.
 struct RefusedPhone {
   std::string name;
   std::string reason;
@@ -74,6 +75,7 @@ struct SelftestOutcome {
   std::size_t wanted = 0;  // the number of phones to run, which is greater than that of `phones` after an interrupt
   std::vector<RefusedPhone> refused;  // not counted in `wanted`
   std::vector<UnusedLimit> unusedLimits{};
+  std::vector<RefusedPhone> notJudged{};  // nor counted in `wanted`
 
   bool isComplete() const { return phones.size() == wanted; }
 };

@@ -2,8 +2,10 @@
 
 #include "base/text/input_error.h"
 #include "contract/message_format.h"
+#include "host/command/expectations.h"
 #include "host/command/selection.h"
 #include "host/command/selftest.h"
+#include "host/command/unknown_name.h"
 #include "host/model/judge.h"
 #include "host/model/limit_check.h"
 #include "host/record/value_json.h"
@@ -121,7 +123,7 @@ class Selftest {
   SelftestOutcome perform() {
     SelftestOutcome outcome;
     outcome.seeds = options_.seeds;
-    const std::vector<WantedPhone> wanted = readPhones(outcome.refused);
+    const std::vector<WantedPhone> wanted = readPhones(outcome);
     outcome.wanted = wanted.size();
     for (const WantedPhone& phone : wanted) {
       showProgress(outcome, phone.name);
@@ -154,8 +156,8 @@ class Selftest {
     return options;
   }
 
-  // The phones with an expected outcome. Those that cannot be run are told and added to `refused`.
-  std::vector<WantedPhone> readPhones(std::vector<RefusedPhone>& refused) {
+  // The phones with an expected outcome. Those that cannot be run are told and added to the outcome.
+  std::vector<WantedPhone> readPhones(SelftestOutcome& outcome) {
     std::vector<WantedPhone> phones;
     for (const std::string& name : wantedPhones(options_.names, installation_)) {
       const std::optional<std::filesystem::path> binding = bindingNamed(name);
@@ -164,11 +166,17 @@ class Selftest {
         ScenarioSummary summary =
             binding ? summaryOfBinding(file) : summaryOfScenario(file, installation_.scenarioSource());
         if (isForOthers(summary)) continue;
-        leaveOutInherited(summary, file);
-        if (!summary.expected.empty()) phones.push_back({name, file, std::move(summary), binding.has_value()});
+        const std::string unloaded =
+            leaveOutUnloaded(summary, file, scan_, [this]() -> const PluginScan& { return others(); });
+        if (!summary.expected.empty()) {
+          phones.push_back({name, file, std::move(summary), binding.has_value()});
+        } else if (!unloaded.empty()) {
+          outcome.notJudged.push_back({name, unloaded});
+        }
+        if (!unloaded.empty()) err_ << "quazor: " << printable(name) << ": " << printable(unloaded) << '\n';
       } catch (const InputError& problem) {
         err_ << "quazor: REFUSED phone " << printable(name) << ": " << printable(problem.what()) << '\n';
-        refused.push_back({name, problem.what()});
+        outcome.refused.push_back({name, problem.what()});
       }
     }
     const auto healthy = std::find_if(phones.begin(), phones.end(),
@@ -190,23 +198,10 @@ class Selftest {
                         [this](const ExpectedOutcome& one) { return findLoaded(one) != nullptr; });
   }
 
-  // Whoever bases a phone on another one need not load the diagnostics of that one: removes what is expected of
-  // diagnostics that are not loaded, or that the phone says it cannot run. Throws InputError if the file itself expects
-  // it, or if a plug-in that failed to load may have the diagnostic.
-  void leaveOutInherited(ScenarioSummary& summary, const std::filesystem::path& file) const {
-    std::erase_if(summary.expected, [&](const ExpectedOutcome& one) {
-      if (const std::optional<Skip> skip = skipOf(one.name, summary.absent)) {
-        failIfNamedIn(file, one,
-                      one.name + " is not run, because \"absent\" says: " + skip->reason + " Remove one of the two.");
-        return true;
-      }
-      if (findLoaded(one) != nullptr) return false;
-      const std::string problem = "no loaded plug-in has " + one.name;
-      failIfNamedIn(file, one, problem + "; load it with --plugin, or remove this entry.");
-      if (scan_.failed.empty()) return true;
-      throw InputError(file.string() + ": " + problem + ", and " + scan_.failed.front().file.string() +
-                       " failed to load.");
-    });
+  // What is installed and not loaded; asked once, and not without processes of its own.
+  const PluginScan& others() {
+    if (!others_) others_ = signals_ == nullptr ? PluginScan() : scanOfOthers(options_, installation_, signals_);
+    return *others_;
   }
 
   void showProgress(const SelftestOutcome& outcome, const std::string& name) {
@@ -406,13 +401,8 @@ class Selftest {
     for (std::size_t i = 0; i < record.faults.size(); ++i) row.faultsFired[i] += record.faults[i].fired;
   }
 
-  // Null if no loaded plug-in has it.
   const DescribedDiagnostic* findLoaded(const ExpectedOutcome& expected) const {
-    for (const DescribedDiagnostic& one : scan_.catalogue) {
-      const Diagnostic& diagnostic = one.diagnostic;
-      if (diagnostic.name == expected.name && diagnostic.experimentOnly == expected.experimentOnly) return &one;
-    }
-    return nullptr;
+    return diagnosticOf(scan_.catalogue, expected);
   }
 
   // readPhones() kept only what is loaded.
@@ -445,6 +435,7 @@ class Selftest {
   const Options options_;
   const Installation& installation_;
   const PluginScan scan_;
+  std::optional<PluginScan> others_;  // what is installed and not loaded, once it is asked
   const IsolationOptions isolation_;
   std::ostream& err_;
   StatusLine status_;
@@ -464,7 +455,10 @@ ExitCode selftestCommand(const Options& options, const Installation& installatio
   const std::string refusal = formatMessage("%@ of %@ phones were refused", refused, outcome.wanted + refused);
   if (outcome.rows.empty()) {
     if (!outcome.isComplete()) throw CommandError(ExitCode::kInterrupted, "interrupted before any phone was tested");
-    const std::string why = refused == 0 ? whyNothingWasTested(options) : refusal;
+    const std::string untested = outcome.notJudged.empty()
+                                     ? whyNothingWasTested(options)
+                                     : "no loaded plug-in has what the phones expect something of";
+    const std::string why = refused == 0 ? untested : refusal;
     throw CommandError(ExitCode::kCannotRead, "nothing was tested: " + why);
   }
   std::ostringstream text = textFor(options.report, console);

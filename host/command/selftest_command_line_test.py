@@ -228,15 +228,42 @@ class PhonesOfAUserTest(CommandLineTest):
         nothing = self.phone_file("nothing.json")
         self.assert_refused(self.selftest(nothing), 66, "nothing was tested")
 
-    def test_an_expectation_of_the_file_itself_needs_its_diagnostic(self):
-        phone = self.on_healthy("named.json", **{BACK: {"verdict": "pass"}})
-        line = phone.read_text()[:phone.read_text().index(BACK)].count("\n") + 1
-        self.assert_refused(self.selftest(phone), 66, f"{phone}:{line}: expect.{BACK}: ", f"no loaded plug-in has {BACK}",
-                            "--plugin")
+    def test_an_expectation_of_the_file_itself_is_told_if_its_diagnostic_is_not_loaded(self):
         entry = {"experiment": "NimbeImageExperiment", "verdict": "pass"}
-        phone = self.on_healthy("experiment.json", **{"One image": entry})
-        self.assert_refused(self.selftest(phone), 66, f"{phone}:", "expect.One image: ",
-                            "no loaded plug-in has NimbeImageExperiment")
+        phone = self.on_healthy("named.json", **{BACK: {"verdict": "error"}, "One image": entry, "Removed": {"verdict": "fail"}})
+        for more in ((), ("--in-process",)):
+            result = self.selftest(phone, *more)
+            self.assertEqual(result.returncode, 0, result.stderr)
+            self.assertEqual(result.stderr, f"quazor: {phone}: what it expects of {BACK}, NimbeImageExperiment, Removed is "
+                             "not compared, because no loaded plug-in has them\n")
+            document = json.loads(result.stdout)
+            self.assertEqual([row["name"] for row in document["rows"]], ["EventCountDiagnostic"])
+            self.assertEqual(document["notJudged"], [])
+
+    def test_a_misspelt_name_in_an_expectation_is_refused(self):
+        for wrong, right in ((BACK.replace("Back", "Bakc"), BACK), ("EventCountDiagnostik", "EventCountDiagnostic")):
+            phone = self.on_healthy("named.json", **{wrong: {"verdict": "pass"}})
+            line = phone.read_text()[:phone.read_text().index(wrong)].count("\n") + 1
+            self.assert_refused(self.selftest(phone), 66, f"{phone}:{line}: expect.{wrong}: no loaded plug-in has {wrong}; "
+                                f"did you mean '{right}'?")
+
+    def test_a_phone_of_a_removed_plug_in_is_named_and_the_others_are_judged(self):
+        data = self.directory / "data"
+        folder = data / "quazor/scenarios/mine"
+        folder.mkdir(parents=True)
+        env = {"XDG_DATA_HOME": str(data), "XDG_STATE_HOME": str(data)}
+        (folder / "left.json").write_text(json.dumps({"title": "Left", "cameras": {}, "groups": {}, "faults": [],
+                                                      "expect": {"Removed": {"verdict": "fail"}}}))
+        told = "what it expects of Removed is not compared, because no loaded plug-in has it"
+        result = quazor("selftest", "mine/*", "healthy", "--seeds", "1", env=env)
+        self.assertEqual((result.returncode, result.stderr), (0, f"quazor: mine/left: {told}\n"))
+        self.assertIn(f"\nNot judged: mine/left: {told}\n", result.stdout.replace("\n  ", " "))
+        result = quazor("selftest", "mine/left", "--plugin", EXAMPLE, "--seeds", "1", env=env)
+        self.assert_refused(result, 66, "nothing was tested: no loaded plug-in has what the phones expect something of")
+        doctor = quazor("doctor", env=env)
+        self.assertEqual(doctor.returncode, 0, doctor.stdout)
+        self.assertIn(f"REMARK   phone {folder / 'left.json'}\n           it expects something of Removed, which no installed "
+                      "plug-in has; if the plug-in was removed, remove the phone, too\n", doctor.stdout)
 
     def test_a_phone_that_is_refused_does_not_keep_the_others_from_being_tested(self):
         data = self.directory / "data"
@@ -245,7 +272,7 @@ class PhonesOfAUserTest(CommandLineTest):
         env = {"XDG_DATA_HOME": str(data)}
         self.on_healthy("good.json").rename(folder / "good.json")
         (folder / "broken.json").write_text('{\n  "title": "Broken",\n  "cameras": 7\n}\n')
-        named = self.on_healthy("named.json", **{BACK: {"verdict": "pass"}})
+        named = self.on_healthy("named.json", **{BACK + "k": {"verdict": "pass"}})
         result = self.selftest("mine/*", named, env=env)
         self.assertEqual(result.returncode, 66, result.stderr)
         self.assertIn("quazor: REFUSED phone mine/broken: ", result.stderr)

@@ -54,6 +54,15 @@ TEST(DifferenceOf, TellsTheFirstThatIsNotAsExpected) {
   }
 }
 
+TEST(DifferenceOf, TakesAnyErrorOfAnEntryThatSaysNone) {
+  ExpectedOutcome any = errs();
+  any.error.reset();
+  EXPECT_THAT(differenceOf(any, recordOf("Name", Verdict::kError)), testing::HasSubstr("the error: expected no error"));
+  any.mayBeAnyError = true;
+  EXPECT_EQ(differenceOf(any, recordOf("Name", Verdict::kError)), "");
+  EXPECT_EQ(differenceOf(any, recordOf("Name", Verdict::kPass)), "the verdict: expected error, got pass");
+}
+
 TEST(DifferenceOf, LooksAtTheUnderlyingErrorAndTheImagesWhereTheyAreExpected) {
   ExpectedOutcome outcome = errs();
   outcome.underlying = ExpectedError{"Deep", 2, "the cause"};

@@ -21,6 +21,17 @@ std::optional<ExpectedError> readExpectedError(const JsonCursor& outcome, std::s
   return ExpectedError{error->at("domain").text(), error->at("code").integer(), error->at("message").text()};
 }
 
+// The error that an entry says, which may be "none" for one that fails without an error of its own. Without an error,
+// the entry means any.
+std::optional<ExpectedError> readErrorOrNone(const JsonCursor& outcome, bool& mayBeAny) {
+  constexpr std::array<std::string_view, 1> kNone{"none"};
+  const std::optional<JsonCursor> error = outcome.find("error");
+  mayBeAny = !error || error->isNull();
+  if (mayBeAny || !error->isString()) return readExpectedError(outcome, "error");
+  error->oneOf(kNone, "an error, which otherwise is an object");
+  return std::nullopt;
+}
+
 void readExperimentRun(const JsonCursor& cursor, ExpectedOutcome& outcome) {
   outcome.name = cursor.at("experiment").text();
   outcome.experimentOnly = true;
@@ -44,7 +55,8 @@ ExpectedOutcome readOutcome(const std::string& name, const JsonCursor& cursor) {
   outcome.name = name;
   outcome.key = name;
   outcome.verdict = cursor.at("verdict").oneOf(kVerdicts, "a verdict");
-  outcome.error = readExpectedError(cursor, "error");
+  outcome.error = readErrorOrNone(cursor, outcome.mayBeAnyError);
+  outcome.mayBeAnyError = outcome.mayBeAnyError && outcome.verdict == "error";
   outcome.underlying = readExpectedError(cursor, "underlying");
   if (outcome.error && outcome.verdict != "error") cursor.fail("only the verdict \"error\" can have an error.");
   if (outcome.underlying && !outcome.error) cursor.fail("an underlying error requires an \"error\".");

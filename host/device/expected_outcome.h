@@ -25,11 +25,12 @@ struct ExpectedOutcome {
   bool experimentOnly = false;  // if so, `parameters` is the complete list of its parameters
   OrderedMap<double> parameters;
   std::string verdict;                      // "pass", "fail" or "error"
-  std::optional<ExpectedError> error;       // nothing: no error, apart from the host's own
+  std::optional<ExpectedError> error;       // nothing: no error, apart from the host's own, or any
   std::optional<ExpectedError> underlying;  // nothing: not compared
   std::vector<std::string> failedResults;
   std::optional<std::uint64_t> images;  // the number of images in the auxiliary data; nothing: not compared
   std::string key;                      // of its entry in "expect"; not `name` if it is a run of an experiment
+  bool mayBeAnyError = false;           // the verdict is "error", and the entry does not say which
 
   // False if the run should find a fault of the phone.
   bool mustPass() const { return verdict == "pass"; }

@@ -42,13 +42,25 @@ TEST(ExpectedOutcomes, AreReadInTheirOrder) {
   EXPECT_EQ(error.underlying->domain, "F");
   EXPECT_EQ(error.underlying->code, -1);
   EXPECT_EQ(error.underlying->message, "O");
+  EXPECT_FALSE(error.mayBeAnyError);
   EXPECT_FALSE(outcomes[1].error || outcomes[1].underlying);
+  EXPECT_TRUE(outcomes[1].mayBeAnyError);
+  EXPECT_FALSE(outcomes[2].mayBeAnyError) << "only an error can be any";
   EXPECT_THAT(outcomes[2].failedResults, testing::ElementsAre("A.Total", "B.Total"));
   const ExpectedOutcome& alone = outcomes[3];
   EXPECT_EQ(alone.name, "X");
   EXPECT_TRUE(alone.experimentOnly);
   EXPECT_EQ(alone.parameters, (OrderedMap<double>{{"images", 5.0}, {"timeout", -0.5}}));
   EXPECT_EQ(alone.images, 6U);
+}
+
+TEST(ExpectedOutcomes, MayLeaveTheErrorOpenOrSayThatThereIsNone) {
+  const ExpectedOutcome any = outcomeWith(R"("verdict": "error")");
+  EXPECT_TRUE(any.mayBeAnyError && !any.error);
+  const ExpectedOutcome none = outcomeWith(R"("verdict": "error", "error": "none")");
+  EXPECT_FALSE(none.mayBeAnyError || none.error);
+  EXPECT_THAT(problemOf(R"({"E": {"verdict": "error", "error": "some"}})"),
+              testing::HasSubstr("p.json:1: expect.E.error: "));
 }
 
 TEST(ExpectedOutcomes, AreToldWithTheLineIfTheFileItselfNamesThem) {
