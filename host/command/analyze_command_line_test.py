@@ -126,6 +126,12 @@ class ForeignRecordTest(RecordTest):
         again = quazor("analyze", self.directory / "changed.jsonl", option, new)
         self.assertEqual(again.returncode, 0, again.stderr)
 
+    def test_a_record_has_the_whole_path_of_a_plug_in_that_was_named_by_a_relative_one(self):
+        plugin = pathlib.Path(WORKING)
+        self.run_fake("--plugin", f"./{plugin.name}", "--record", self.record, cwd=plugin.parent)
+        self.assertEqual(events_in(self.record)[0]["plugins"][-1], str(plugin))
+        self.assert_refused(quazor("analyze", self.record, cwd="/"), 66, "which is not an installed one; to load it, name it")
+
     def test_a_rerun_of_a_given_record_loads_none_either(self):
         self.recorded(*self.failing, code=1)
         self.assert_refused(quazor("run", "--only", "failed", "--of", self.record, env=self.state), 66,

@@ -130,6 +130,16 @@ class Doctor {
     }
   }
 
+  // What the profile, the last one of `all`, is based on, and the installed one that it hides.
+  std::string relationsOf(const std::filesystem::path& file, const std::vector<Profile>& all) const {
+    std::string relations;
+    if (all.size() > 1) relations += "; based on '" + all[all.size() - 2].file.string() + "'";
+    const std::filesystem::path hidden = installation_.profileSource()(file.stem().string(), {file});
+    const bool isBase = std::ranges::find(all, hidden, &Profile::file) != all.end();
+    if (!hidden.empty() && !isBase) relations += "; it hides '" + hidden.string() + "'";
+    return relations;
+  }
+
   // The default profile comes first, and is missed if it is not there.
   void checkProfiles() {
     const std::filesystem::path byDefault = installation_.defaultProfile();
@@ -147,7 +157,8 @@ class Doctor {
         read = all.back();
         hidesDefault = file == byDefault && !hiddenDefaultProfile(installation_).empty();
         return "entries for " + countText(read.entries.size(), "diagnostic") + " and " +
-               countText(read.experiments.size(), "experiment") + (file == byDefault ? "; the default profile" : "");
+               countText(read.experiments.size(), "experiment") + relationsOf(file, all) +
+               (file == byDefault ? "; the default profile" : "");
       });
       if (hidesDefault) remark("profile", file.string(), std::string("it ") + kHidesDefaultProfile);
       if (areAllLoaded_) remarkUnusedEntries(read);

@@ -74,6 +74,17 @@ class FoundPluginsTest(PluginFoldersTest):
         shutil.copy(WORKING, self.own / "camera_sensor_diagnostics.so")
         self.assertNotIn(SHIPPED, self.listed(path=str(self.path)))
 
+    def test_a_refused_one_tells_what_it_hides(self):
+        (self.path / "camera_sensor_diagnostics.so").write_text("no plug-in")
+        told = "camera_sensor_diagnostics.so', which has the same file name"
+        for arguments in (("list",), ("run", "--all")):
+            result = self.quazor(*arguments, path=str(self.path))
+            text = " ".join((result.stdout + result.stderr).split())
+            self.assertEqual(text.count("; it hides '"), 1, text)
+            self.assertIn(told, text)
+        self.assertNotIn("it hides", self.quazor("list", "--plugin", self.path / "camera_sensor_diagnostics.so",
+                                                 path=str(self.path)).stderr)
+
     def test_the_path_of_the_environment_is_checked(self):
         for path, why in ((f"{self.path}:", "an entry is empty"), (f":{self.path}", "an entry is empty"),
                           (f"{self.path}::/usr", "an entry is empty"), ("here", "the entry 'here' is relative")):

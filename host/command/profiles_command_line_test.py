@@ -6,7 +6,7 @@ import shutil
 import subprocess
 import unittest
 
-from command_line_fixture import PROGRAM, WORKING, CommandLineTest, quazor
+from command_line_fixture import PROGRAM, WORKING, CommandLineTest, events_in, quazor
 
 LIMITS = {"schema": 1, "diagnostics": {"Fake.One": {"limits": [{"limit": "Total >= 90"}]}}}
 
@@ -41,19 +41,24 @@ class ProfilesCase(CommandLineTest):
 
 class OwnDefaultTest(ProfilesCase):
     def test_it_takes_the_place_of_the_installed_one(self):
-        self.add("default", values(duration=7))
-        self.assertRegex(self.describe().stdout, r"duration +7  profile default\.json")
-        self.assertRegex(self.describe("--profile", "default").stdout, r"duration +7  profile default\.json")
+        own = self.add("default", values(duration=7))
+        # The installed one has the same file name.
+        self.assertRegex(self.describe().stdout, f"duration +7  profile {own} ")
+        self.assertRegex(self.describe("--profile", "default").stdout, f"duration +7  profile {own} ")
         self.assertRegex(self.describe("--profile", "none").stdout, r"duration +-  not set, required")
         self.install_working()
         installed = quazor("describe", "CameraSyncDiagnostic.Back", env=self.environment).stdout
-        self.assertNotIn("profile default.json", installed)
+        self.assertNotIn("profile", installed)
 
     def test_its_limits_count(self):
         content = values(duration=1)
         content["diagnostics"]["Fake.One"]["limits"] = [{"limit": "Nothing > 1"}]
         self.add("default", content)
         self.assertIn("Nothing > 1", self.run_one().stdout)
+        file = self.folder / "default.json"
+        self.run_one("--record", self.directory / "run.jsonl")
+        limits = events_in(self.directory / "run.jsonl")[0]["limits"]
+        self.assertEqual([limit["source"] for limit in limits], [f"profile {file}"])
         self.assertNotIn("Nothing > 1", self.run_one("--profile", "none", "--set", "duration=1").stdout)
 
     def test_its_mistake_is_told(self):
@@ -75,8 +80,14 @@ class OwnDefaultTest(ProfilesCase):
         self.assertIn((str(own), "entries for 2 diagnostics and 0 experiments"), profiles)
         own = self.add("default", values(duration=1))
         profiles = self.profiles_of_doctor()
+        installed = next(name for name, _ in self.profiles_of_doctor(with_own=False) if name.endswith("default.json"))
+        self.assertIn((str(own), f"entries for 2 diagnostics and 0 experiments; it hides '{installed}'; the default profile"),
+                      profiles)
         self.assertEqual([name for name, finding in profiles if finding.endswith("; the default profile")], [str(own)])
         self.assertEqual(len([name for name, _ in profiles if name.endswith("default.json")]), 1)
+        self.add("default", {"base": "default", **values(duration=1)})
+        self.assertIn((str(own), f"entries for 2 diagnostics and 0 experiments; based on '{installed}'; "
+                       "the default profile"), self.profiles_of_doctor())
 
     def test_one_without_base_is_named_where_a_value_of_the_installed_one_is_missing(self):
         self.install_working()
@@ -90,8 +101,9 @@ class OwnDefaultTest(ProfilesCase):
         self.assertEqual(quazor("run", "CameraSyncDiagnostic.Back", env=self.environment).returncode, 0)
         self.assertNotIn("it hides", quazor("doctor", env=self.environment).stdout)
 
-    def profiles_of_doctor(self):
-        result = quazor("doctor", env={**self.environment, "XDG_STATE_HOME": str(self.directory)})
+    def profiles_of_doctor(self, with_own=True):
+        environment = self.environment if with_own else {}
+        result = quazor("doctor", env={**environment, "XDG_STATE_HOME": str(self.directory)})
         self.assertEqual(result.returncode, 0, result.stdout)
         lines = result.stdout.splitlines()
         start = "ok       profile "
@@ -125,7 +137,7 @@ class AddedProfileTest(ProfilesCase):
     def test_parameters_take_names_like_profile(self):
         self.add("more", values(measured=5))
         result = self.describe("--parameters", "more")
-        self.assertRegex(result.stdout, r"duration +1  profile default\.json")
+        self.assertRegex(result.stdout, f"duration +1  profile {self.folder / 'default.json'} ")
         self.assertRegex(result.stdout, r"measured +5  profile more\.json")
         self.assertEqual(self.describe("--parameters", self.folder / "more.json").stdout, result.stdout)
         result = self.run_one("--parameters", "more", "--output", self.folder / "more.json")
@@ -146,7 +158,7 @@ class BaseTest(ProfilesCase):
 
     def test_an_own_default_profile_extends_the_installed_one(self):
         own = self.add("default", self.profile("default", self.BACK))
-        self.assertRegex(self.described("CameraSyncDiagnostic.Back"), r"duration +4 +profile default\.json")
+        self.assertRegex(self.described("CameraSyncDiagnostic.Back"), f"duration +4 +profile {own} ")
         self.assertRegex(self.described("CameraSyncDiagnostic.Front"), r"duration +3 +profile default\.json")
         self.assertRegex(self.described("TesselFaultDiagnostic"), r"frameCount +90 ")
         self.assertRegex(self.described("CameraSyncDiagnostic.Back", "--profile", own), r"duration +4 ")

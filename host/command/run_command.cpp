@@ -78,7 +78,9 @@ std::vector<UserLimit> limitsOfAnalysis(const std::vector<UserLimit>& recorded, 
 RunStarted beginningOf(const Options& options, const Installation& installation, const std::vector<Job>& jobs,
                        const std::vector<FailedPlugin>& failed) {
   RunStarted began{QUAZOR_VERSION, QUAZOR_CONTRACT_VERSION, dateNow(), {}, {}, options.seed, false, {}};
-  for (const auto& file : isolationOf(options, installation).plugins) began.plugins.push_back(file.string());
+  for (const auto& file : isolationOf(options, installation).plugins) {
+    began.plugins.push_back(std::filesystem::absolute(file).lexically_normal().string());
+  }
   began.id = randomIdentifier();
   began.host = nameOfThisMachine();
   began.tags = options.tags;

@@ -62,6 +62,7 @@ void leaveOut(const std::string& pattern, bool mayBeNone, std::vector<Diagnostic
 void addProfile(const std::filesystem::path& file, const Installation& installation, std::vector<Profile>& profiles) {
   for (Profile& one : readProfileAndBases(file, installation.profileSource())) {
     one.mayNameOthers = installation.isInstalledProfile(one.file);
+    one.showsPath = !one.mayNameOthers && !installation.profileSource()(one.file.stem().string(), {one.file}).empty();
     profiles.push_back(std::move(one));
   }
 }
@@ -261,6 +262,22 @@ IsolationOptions isolationOf(const Options& options, const Installation& install
   return isolation;
 }
 
+namespace {
+
+// Adds to the errors of plug-ins that could not be loaded that others are not loaded because of them.
+void tellWhatFailedOnesHide(const std::vector<HiddenPlugin>& hidden, std::vector<FailedPlugin>& failed) {
+  for (FailedPlugin& one : failed) {
+    for (const HiddenPlugin& other : hidden) {
+      if (other.by != one.file) continue;
+      const std::string hint = formatMessage("; it hides '%@', which has the same file name", other.file.string());
+      one.error = errorWithMessage(one.error->domain(), one.error->code(), one.error->localizedDescription() + hint,
+                                   one.error->underlyingError());
+    }
+  }
+}
+
+}  // namespace
+
 PluginScan scanOf(const Options& options, const Installation& installation, const DiagnosticChoice& described,
                   WatchedSignals* signals) {
   const IsolationOptions isolation = isolationOf(options, installation);
@@ -277,6 +294,7 @@ PluginScan scanOf(const Options& options, const Installation& installation, cons
   if (signals == nullptr) signals = &own.emplace();
   scan = scanPlugins(isolation, *signals, described);
   if (signals->requestsToEnd() > 0) refuseInterrupted();
+  if (options.plugins.empty()) tellWhatFailedOnesHide(installation.hiddenPlugins(), scan.failed);
   return scan;
 }
 

@@ -79,7 +79,7 @@ std::vector<ResolvedParameter> resolvePart(const DescribedDiagnostic& diagnostic
       const Value* const value = findIn(profile, diagnostic.diagnostic, part, name);
       if (value == nullptr) continue;
       parameter.value = *value;
-      parameter.source = profile.kind + " " + profile.file.filename().string();
+      parameter.source = profile.source();
     }
     for (const OverridePlace place : {OverridePlace::kEnvironment, OverridePlace::kCommandLine}) {
       for (const ParameterOverride& setting : settings) {

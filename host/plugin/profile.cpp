@@ -90,7 +90,7 @@ void addLimit(const std::string& diagnostic, const JsonCursor& entry, Profile& p
     if (severity) limit.severity = *limitSeverityNamed(severity->oneOf(kNames, "a severity"));
   });
   limit.diagnostic = diagnostic;
-  limit.source = "profile " + profile.file.filename().string();
+  limit.source = profile.source();
   limit.onlyIfSelected = true;
   profile.limits.push_back(std::move(limit));
 }
@@ -175,6 +175,8 @@ const Value* Profile::findForExperiment(const std::string& experiment, const std
   return valueIn(entryForExperiment(*this, experiment, usedBy, parameter), Part::kExperiment, parameter);
 }
 
+std::string Profile::source() const { return kind + " " + (showsPath ? file : file.filename()).string(); }
+
 std::string Profile::pathOf(const ProfileEntry& entry) {
   return jsonPath(std::string(entry.ofExperiment ? kExperiments : kDiagnostics), entry.name);
 }
@@ -200,7 +202,9 @@ std::vector<Profile> readProfileAndBases(const std::filesystem::path& file, cons
 
 std::vector<UserLimit> limitsOf(const std::vector<Profile>& profiles) {
   std::vector<UserLimit> limits;
-  for (const Profile& one : profiles) limits.insert(limits.end(), one.limits.begin(), one.limits.end());
+  for (const Profile& one : profiles) {
+    for (const UserLimit& limit : one.limits) limits.emplace_back(limit).source = one.source();
+  }
   return limits;
 }
 

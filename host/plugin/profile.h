@@ -60,6 +60,10 @@ struct Profile {
   // The text of the file, for the lines of mistakes; null for values that do not come from a profile.
   std::shared_ptr<const JsonDocument> document{};
   FirstMistake mistakes{};  // of the form, if they were not thrown
+  bool showsPath = false;   // there is another profile with this file name
+
+  // The kind and the file name or, if it shows it, the path: the source of its values and limits.
+  std::string source() const;
 
   // The path of an entry in the document, or of the value of one of its parameters.
   static std::string pathOf(const ProfileEntry& entry);
@@ -92,7 +96,7 @@ using ProfileSource =
 // exist or is based on the profile itself.
 std::vector<Profile> readProfileAndBases(const std::filesystem::path& file, const ProfileSource& source);
 
-// The limits of these profiles, in their order.
+// The limits of these profiles, in their order, with the profiles' source().
 std::vector<UserLimit> limitsOf(const std::vector<Profile>& profiles);
 
 // The profile in the text of the file, without its base. Throws InputError with the file, the line and the place if it

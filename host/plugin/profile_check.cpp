@@ -174,9 +174,8 @@ std::vector<std::string> limitsForOtherValues(const Profile& profile, const std:
   const auto compare = [&](const ProfileEntry& entry, Part part, const ResolvedParameter& now) {
     const Value* const meant = entry.values(part).find(now.name);
     if (meant == nullptr || !now.value || defaultText(*meant) == defaultText(*now.value)) return;
-    std::string sentence =
-        formatMessage("the limits of the %@ %@ for %@ are made for %@=%@, but it is %@ (%@)", profile.kind,
-                      profile.file.filename().string(), entry.name, now.name, *meant, *now.value, now.source);
+    std::string sentence = formatMessage("the limits of the %@ for %@ are made for %@=%@, but it is %@ (%@)",
+                                         profile.source(), entry.name, now.name, *meant, *now.value, now.source);
     if (!isAmong(sentences, sentence)) sentences.push_back(std::move(sentence));
   };
   for (const ProfileEntry& entry : profile.entries) {
