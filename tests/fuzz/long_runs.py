@@ -29,7 +29,7 @@ ROOT = pathlib.Path(__file__).resolve().parents[2]
 HEARTBEAT = 5.0  # seconds between two saves of the sums
 LIMITS = ("-max_len=65536", "-rss_limit_mb=4096")
 LONGEST_UNIT = 10  # seconds of processor time
-STARVED = 6  # so many times as long may it take on the clock of a busy machine, before it is tried alone
+STARVED = 60  # so many times as long may it take on the clock of a busy machine
 TOO_SLOW = ("timeout-", "slow-unit-")
 PROGRESS = re.compile(r"\bcov: (\d+)")
 EXECUTIONS = re.compile(r"stat::number_of_executed_units: *(\d+)")
@@ -97,7 +97,7 @@ def fails(programs, fuzzer, kept):
     """Whether an input fails if it is tried alone."""
     def limit():
         resource.setrlimit(resource.RLIMIT_CPU, (LONGEST_UNIT, LONGEST_UNIT))
-    command = command_of(programs, fuzzer, *LIMITS, "-timeout=0", kept)
+    command = [programs / f"{fuzzer}_fuzzer", *LIMITS, "-timeout=0", kept]
     try:
         return subprocess.run(command, capture_output=True, check=False, preexec_fn=limit,
                               timeout=LONGEST_UNIT * STARVED).returncode != 0
