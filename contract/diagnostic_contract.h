@@ -38,8 +38,8 @@ class QUAZOR_EXPORT QZExperiment {
   virtual QZDescription experimentDescription() const = 0;
   // Returns the result, owned by the caller, or null on failure.
   [[nodiscard]] virtual std::unique_ptr<QZExperimentResult> run(DiagnosticErrorPtr* error) = 0;
-  // `parameters` contains one number per declared parameter; a missing one reads as 0. `host` may be null. The
-  // default implementation ignores the parameters and succeeds.
+  // `parameters` has a number for each declared parameter that has a value, and nothing for the others: the default of
+  // a QZParameterRange is not filled in. `host` may be null. The base class ignores the parameters and succeeds.
   [[nodiscard]] virtual bool setupWithParameters(const Dictionary& parameters, QZDiagnosticHost* host,
                                                  DiagnosticErrorPtr* error);
 };

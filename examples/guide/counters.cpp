@@ -1,10 +1,11 @@
-// Counters: how often the rails of the image signal processor are switched, in all and during a wait.
+// Counters: how often the rails of the image signal processor are switched, in all and while a camera streams.
 #include "contract/diagnostic_contract.h"
 #include "contract/lab.h"
 #include "platform/platform.h"
 
 #include <chrono>
 #include <memory>
+#include <optional>
 #include <string_view>
 #include <utility>
 
@@ -21,15 +22,28 @@ constexpr std::string_view kRise = "Switches Meanwhile";
 constexpr std::string_view kRailSwitchErrorDomain = "RailSwitchErrorDomain";
 constexpr int kNoReport = 1;
 constexpr int kNoCount = 2;
+constexpr int kNotStreaming = 3;
 constexpr int kMissingMeasurement = 6;  // of QZErrorDomain
+
+// Gives the device back on every path: stops its streams and releases their control.
+class InvalidatedAtEnd {
+ public:
+  explicit InvalidatedAtEnd(std::shared_ptr<CaptureDevice> device) : device_(std::move(device)) {}
+  InvalidatedAtEnd(const InvalidatedAtEnd&) = delete;
+  InvalidatedAtEnd& operator=(const InvalidatedAtEnd&) = delete;
+  ~InvalidatedAtEnd() { static_cast<void>(device_->invalidate(nullptr)); }
+
+ private:
+  const std::shared_ptr<CaptureDevice> device_;
+};
 
 class RailSwitchExperiment final : public QZExperiment {
  public:
   explicit RailSwitchExperiment(const Platform& platform = installedPlatform())
-      : reports_(platform.reports), clock_(platform.clock) {}
+      : reports_(platform.reports), capture_(platform.capture), clock_(platform.clock) {}
 
   QZDescription experimentDescription() const override {
-    return QZDescription("Count the switches of the rails, and again after a second.");
+    return QZDescription("Count the switches of the rails, and those while a camera streams for a second.");
   }
 
   std::unique_ptr<QZExperimentResult> run(DiagnosticErrorPtr* error) override {
@@ -38,6 +52,12 @@ class RailSwitchExperiment final : public QZExperiment {
     const auto wanted = all == nullptr ? nullptr : all->reportByFilteringChannels(isWanted);
     const auto before = wanted == nullptr ? nullptr : wanted->snapshot(&reason);
     if (before == nullptr) return failReport(error, reason);
+
+    const auto plugIn = capture_->createPlugIn();
+    const auto device = plugIn == nullptr ? nullptr : plugIn->device(&reason);
+    if (device == nullptr) return failStream(error, reason);
+    const InvalidatedAtEnd invalidated(device);
+    if (!startFirstCamera(*device, &reason)) return failStream(error, reason);
     clock_->sleep(std::chrono::seconds(1));
     const auto after = wanted->snapshot(&reason);
     const auto rise = after == nullptr ? nullptr : after->snapshotWithBaseline(*before, &reason);
@@ -61,6 +81,17 @@ class RailSwitchExperiment final : public QZExperiment {
     return nullptr;
   }
 
+  static std::unique_ptr<QZExperimentResult> failStream(DiagnosticErrorPtr* error, const DiagnosticErrorPtr& reason) {
+    fail(error, kRailSwitchErrorDomain, kNotStreaming, reason, "No camera can be started.");
+    return nullptr;
+  }
+
+  static bool startFirstCamera(CaptureDevice& device, DiagnosticErrorPtr* reason) {
+    const std::optional<CaptureStreams> streams = device.streams(reason);
+    return streams && !streams->empty() && device.requestControlOfStreams({streams->front()}, reason) &&
+           streams->front()->start(reason);
+  }
+
   // Returns false if the snapshot has no such channel, or one without a count.
   static bool measure(const ReportSnapshot& snapshot, std::string_view name, QZExperimentResult& result) {
     if (snapshot.samples().empty() || !snapshot.samples().front().channel().count()) return false;
@@ -70,13 +101,14 @@ class RailSwitchExperiment final : public QZExperiment {
   }
 
   const std::shared_ptr<ReportFacility> reports_;
+  const std::shared_ptr<CaptureService> capture_;
   const std::shared_ptr<Clock> clock_;
 };
 
 class RailSwitchAnalysis final : public QZAnalysis {
  public:
   QZDescription analysisDescription() const override {
-    return QZDescription("Ensure that the rails were switched seldom, and not at all in between.");
+    return QZDescription("Ensure that the rails were switched seldom, and not at all while the camera streamed.");
   }
 
   std::unique_ptr<QZAnalysisResult> analyzeExperimentResult(const QZExperimentResult& result,

@@ -1,6 +1,7 @@
 // Defaults: how bright the display is, with a limit that a user may change.
 #include "contract/diagnostic_contract.h"
 #include "contract/lab.h"
+#include "contract/parameter_range.h"
 #include "platform/platform.h"
 
 #include <memory>
@@ -50,13 +51,23 @@ class BrightnessExperiment final : public QZExperiment {
   const std::shared_ptr<FramebufferService> framebuffer_;
 };
 
-class BrightnessAnalysis final : public QZAnalysis, public QZAnalysisSetup {
+class BrightnessAnalysis final : public QZAnalysis, public QZAnalysisSetup, public QZParameterRanges {
  public:
   QZDescription analysisDescription() const override {
     QZDescription description("Ensure that the display is bright enough to be seen.");
-    description.addParameter(QZNumberParameter("The lowest brightness that passes, in percent; default 10.", false),
-                             "minimum");
+    description.addParameter(QZNumberParameter("The lowest brightness that passes.", false), "minimum");
     return description;
+  }
+
+  OrderedMap<QZParameterRange> parameterRanges() const override {
+    QZParameterRange minimum;
+    minimum.setMinimum(0);
+    minimum.setMaximum(100);
+    minimum.setUnit("%");
+    minimum.setDefault(kDefaultMinimum);
+    OrderedMap<QZParameterRange> ranges;
+    ranges.set("minimum", minimum);
+    return ranges;
   }
 
   bool setupWithParameters(const Dictionary& parameters, QZDiagnosticHost*, DiagnosticErrorPtr* error) override {

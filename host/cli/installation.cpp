@@ -172,6 +172,11 @@ std::function<fs::path(const std::string& name, const std::vector<fs::path>& oth
   };
 }
 
+bool Installation::isInstalledProfile(const fs::path& file) const {
+  std::error_code ignored;
+  return fs::equivalent(file.parent_path(), data_ / "profiles", ignored);
+}
+
 std::vector<std::string> Installation::profileNames() const { return dataNames("profiles"); }
 
 fs::path Installation::defaultScenario() const { return data_ / "scenarios" / "healthy.json"; }

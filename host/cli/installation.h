@@ -71,6 +71,8 @@ class Installation {
   std::function<std::filesystem::path(const std::string& name, const std::vector<std::filesystem::path>& others)>
   profileSource() const;
   std::vector<std::string> profileNames() const;
+  // True for a profile in the folder of the installation, which serves every user of the machine.
+  bool isInstalledProfile(const std::filesystem::path& file) const;
   std::filesystem::path defaultScenario() const;
   // The folders with explanations, those of the user first.
   std::vector<std::filesystem::path> explanations() const;

@@ -1,11 +1,31 @@
 #include "host/cli/report_command_options.h"
 
+#include "contract/message_format.h"
 #include "host/error/exit_code.h"
+#include "host/report/report_format.h"
 #include "host/run/deadlines.h"
 
 #include <CLI/CLI.hpp>
 
+#include <optional>
+#include <string>
+
 namespace quazor {
+
+namespace {
+
+// Why the command cannot write that format; empty if it can.
+std::string problemOfFormat(const std::string& name) {
+  const std::optional<Format> format = formatNamed(name);
+  if (format == Format::kHtml || format == Format::kTrace) return {};
+  if (!format) return name + " not in {html,trace}";
+  return formatMessage(
+      "this command writes html and trace; for %@, 'quazor analyze RECORD --output %@:FILE' judges the "
+      "record again, and 'quazor run --output %@:FILE' writes it on a run",
+      name, name, name);
+}
+
+}  // namespace
 
 void addReportCommandOptions(CLI::App& command, ReportCommandTexts& texts) {
   command
@@ -13,7 +33,7 @@ void addReportCommandOptions(CLI::App& command, ReportCommandTexts& texts) {
                   "html: one page for people, which needs no network; trace: a time line of diagnostics, stages, log "
                   "lines and frames, in the Trace Event Format that Perfetto, speedscope and Chrome open. Default html")
       ->type_name("FORMAT")
-      ->check(CLI::IsMember({"html", "trace"}).description(""));
+      ->check(CLI::Validator(problemOfFormat, ""));
   command.add_flag("--compare", texts.compare, "Make a page of what differs between two records");
   command.add_flag("--no-frames", texts.noFrames, "Leave the frames out of the page");
   command.add_option("--from", texts.from, "Leave out what ends before this time; 0 is the beginning of the run")

@@ -130,6 +130,17 @@ class AttemptsTest(RecordTest):
                             "--accept-flaky requires --attempts")
         self.assertEqual(quazor("selftest", "--attempts", "2").returncode, 64)
 
+    def test_failing_repetitions_are_shown_once_for_each_kind(self):
+        def blocks(*arguments):
+            text = self.run_script("fffefe", "--repeat", "6", *arguments, names=BOTH[:1]).stdout
+            beginning = text[:text.index("What varied")]
+            return [line for line in beginning.splitlines() if "Scripted.One" in line], beginning.count("Limit")
+
+        lines, tables = blocks()
+        self.assertEqual(([line.split()[:4] for line in lines], tables),
+                         ([["FAIL", "Scripted.One", "repetition", "1"], ["ERROR", "Scripted.One", "repetition", "4"]], 1))
+        self.assertEqual(len(blocks("--verbose")[0]), 6)
+
     def test_every_report_has_attempts_and_repetitions(self):
         self.run_script("epn", "--attempts", "2", "--repeat", "2", "--accept-flaky", "--output",
                         f"junit:{self.directory / 'j'}", "--output", f"csv:{self.directory / 'c'}", "--output",
@@ -209,7 +220,7 @@ class AttemptsTest(RecordTest):
         expected = ("Repetition 1 of 3: 2 passed\n"
                     f"FAIL  Scripted.One  repetition 2 of 3, seed {seeds[1]}, 2 results, 2 with limits, 1 failed\n"
                     "Repetition 2 of 3: 1 passed, 1 failed\n"
-                    f"ERROR Scripted.One  repetition 3 of 3, seed {seeds[2]}\n"
+                    f"ERROR Scripted.One  repetition 3 of 3, seed {seeds[2]}, Script code 7: the script says so\n"
                     "Repetition 3 of 3: 1 passed, 1 ended in an error\n")
         report = self.directory / "report.txt"
         done = self.run_script(script, "--repeat", "3", "--output", f"text:{report}")

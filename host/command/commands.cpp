@@ -66,6 +66,7 @@ ExitCode list(const Options& options, const Installation& installation, Console&
 
 ExitCode describe(const Options& options, const Installation& installation, Console& console) {
   const Selection selection = select(options, installation);
+  tellRemarks(selection, selection.diagnostics, console.err);
   std::ostringstream text = textFor(options.report, console);
   if (options.report.format == Format::kJson) {
     text << documentText(descriptionDocument(selection.diagnostics));

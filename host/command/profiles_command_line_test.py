@@ -1,15 +1,19 @@
 """Profiles of one's own, and the names of profiles, phones and commands."""
 
 import json
+import pathlib
+import shutil
+import subprocess
 import unittest
 
-from command_line_fixture import WORKING, CommandLineTest, quazor
+from command_line_fixture import PROGRAM, WORKING, CommandLineTest, quazor
 
 LIMITS = {"schema": 1, "diagnostics": {"Fake.One": {"limits": [{"limit": "Total >= 90"}]}}}
 
 
 def values(**parameters):
-    return {"schema": 1, "diagnostics": {"Fake.One": {"experiment": parameters}, "Other.*": {"experiment": {"x": 1}}}}
+    return {"schema": 1, "diagnostics": {"Fake.One": {"experiment": parameters},
+                                         "SingleCamera*": {"experiment": {"camera": 1}}}}
 
 
 class ProfilesCase(CommandLineTest):
@@ -24,6 +28,10 @@ class ProfilesCase(CommandLineTest):
         file.write_text(json.dumps(content))
         return file
 
+    def install_working(self):
+        (self.directory / "quazor" / "plugins").mkdir()
+        (self.directory / "quazor" / "plugins" / pathlib.Path(WORKING).name).symlink_to(WORKING)
+
     def describe(self, *arguments):
         return quazor("describe", "Fake.One", "--plugin", WORKING, *arguments, env=self.environment)
 
@@ -37,6 +45,7 @@ class OwnDefaultTest(ProfilesCase):
         self.assertRegex(self.describe().stdout, r"duration +7  profile default\.json")
         self.assertRegex(self.describe("--profile", "default").stdout, r"duration +7  profile default\.json")
         self.assertRegex(self.describe("--profile", "none").stdout, r"duration +-  not set, required")
+        self.install_working()
         installed = quazor("describe", "CameraSyncDiagnostic.Back", env=self.environment).stdout
         self.assertNotIn("profile default.json", installed)
 
@@ -70,6 +79,7 @@ class OwnDefaultTest(ProfilesCase):
         self.assertEqual(len([name for name, _ in profiles if name.endswith("default.json")]), 1)
 
     def test_one_without_base_is_named_where_a_value_of_the_installed_one_is_missing(self):
+        self.install_working()
         own = self.add("default", values(duration=7))
         hint = f'; {own} hides the shipped default profile, whose values it has only with "base": "default"'
         run = quazor("run", "CameraSyncDiagnostic.Back", env=self.environment)
@@ -117,9 +127,7 @@ class AddedProfileTest(ProfilesCase):
         result = self.describe("--parameters", "more")
         self.assertRegex(result.stdout, r"duration +1  profile default\.json")
         self.assertRegex(result.stdout, r"measured +5  profile more\.json")
-        # As a file, it must not name what is not loaded.
-        result = self.describe("--parameters", self.folder / "more.json")
-        self.assert_refused(result, 66, "no diagnostic matches this pattern")
+        self.assertEqual(self.describe("--parameters", self.folder / "more.json").stdout, result.stdout)
         result = self.run_one("--parameters", "more", "--output", self.folder / "more.json")
         self.assert_refused(result, 64, "is an input of this run")
         self.assertRegex(quazor("run", "--help").stdout, r"--parameters FILE\|NAME .*values and limits")
@@ -209,14 +217,66 @@ class LimitsForOtherValuesTest(CommandLineTest):
 
 
 class EntriesForOthersTest(ProfilesCase):
-    def test_only_an_installed_profile_may_name_what_is_not_loaded(self):
-        content = {"schema": 1, "diagnostics": {"Fake.One": {"experiment": {"duration": 1}}, "Nowhere": {}}}
-        file = self.write("others.json", json.dumps(content))
-        self.assert_refused(self.run_one("--profile", file), 66, "Nowhere: no diagnostic has this name",
-                            "Only a profile in a folder of profiles may have entries for plug-ins that are not loaded: "
-                            "load the plug-in with --plugin, remove the entry, or put the file there and give its name.\n")
-        self.add("others", content)
-        self.assertEqual(self.run_one("--profile", "others").returncode, 0)
+    WAY_OUT = ("An entry must be for a plug-in that is loaded or installed: correct the name, remove the entry, or load the "
+               "plug-in with --plugin.\n")
+
+    def content(self, *names):
+        return {"schema": 1, "diagnostics": {"Fake.One": {"experiment": {"duration": 1}}, **{name: {} for name in names}}}
+
+    def test_an_entry_for_what_no_plugin_has_is_refused_by_name_and_by_path(self):
+        for name, told in (("Fake.Onee", 'Fake.Onee: no diagnostic has this name; did you mean "Fake.One"? '),
+                           ("CameraSyncDiagnostic.Bakc", 'did you mean "CameraSyncDiagnostic.Back"? '),
+                           ("Nowhere*", "no diagnostic matches this pattern; ")):
+            file = self.add("line", self.content(name))
+            for given in ("line", file):
+                for option in ("--profile", "--parameters"):
+                    with self.subTest(name=name, given=given, option=option):
+                        result = quazor("run", "Fake.One", "--plugin", WORKING, option, given, env=self.environment)
+                        self.assert_refused(result, 66, told, self.WAY_OUT)
+        self.add("default", self.content("Fake.Onee"))
+        self.assert_refused(self.run_one(), 66, "did you mean", self.WAY_OUT)
+        self.assert_refused(quazor("run", "--all", env=self.environment), 66, "Fake.One: no diagnostic", self.WAY_OUT)
+
+    def test_an_entry_for_an_installed_plugin_that_is_not_loaded_is_accepted(self):
+        file = self.add("line", self.content("CameraSyncDiagnostic.Back", "Tessel*"))
+        for given in ("line", file):
+            result = self.run_one("--profile", given)
+            self.assertEqual(result.returncode, 0, result.stderr)
+            self.assertNotIn("line.json", result.stderr)
+
+    def test_in_process_the_plugins_that_are_not_loaded_cannot_be_asked(self):
+        self.add("line", self.content("Fake.Onee"))
+        result = self.run_one("--profile", "line", "--in-process")
+        self.assertEqual(result.returncode, 0, result.stderr)
+        self.assertIn('line.json:1: diagnostics.Fake.Onee: no diagnostic has this name; did you mean "Fake.One"?\n', result.stderr)
+
+    def test_a_plugin_that_cannot_be_loaded_may_have_what_an_entry_is_for(self):
+        self.add("line", self.content("Nowhere"))
+        (self.directory / "quazor" / "plugins").mkdir()
+        (self.directory / "quazor" / "plugins" / "broken.so").write_text("no plug-in")
+        self.assertEqual(self.run_one("--profile", "line").returncode, 0)
+
+    def test_an_installed_profile_is_remarked_upon(self):
+        prefix = self.directory / "prefix"
+        source = pathlib.Path(PROGRAM).resolve().parent.parent
+        (prefix / "bin").mkdir(parents=True)
+        shutil.copy(PROGRAM, prefix / "bin" / "quazor")
+        for one in ("lib", "share"):
+            if (source / one).exists():
+                shutil.copytree(source / one, prefix / one)
+        machine = prefix / "share" / "quazor" / "profiles" / "machine.json"
+        machine.write_text(json.dumps({"schema": 1, "diagnostics": {"CameraSyncDiagnostic.Bakc": {}}}))
+
+        def run(*arguments):
+            done = subprocess.run([prefix / "bin" / "quazor", "run", *arguments, "--parameters", "machine"], text=True,
+                                  capture_output=True, check=False)
+            return done.returncode, done.stderr
+
+        told = (f"quazor: {machine}:1: diagnostics.CameraSyncDiagnostic.Bakc: no diagnostic has this name; did you mean "
+                '"CameraSyncDiagnostic.Back"?\n')
+        self.assertEqual(run("CameraSyncDiagnostic.Back"), (0, told))
+        self.assertEqual(run("Fake.One", "--plugin", WORKING, "--set", "duration=1", "--phone", self.phone,
+                             "--log-level", "error", "--profile", "none")[0], 0)
 
 
 class SuggestedNamesTest(ProfilesCase):

@@ -119,7 +119,9 @@ class TimelineTest(RecordTest):
         self.run_diagnostics()
         for arguments, code, text in [
                 (["report"], 64, "RECORD"),
-                (["report", self.record, "--format", "pdf"], 64, "html"),
+                (["report", self.record, "--format", "pdf"], 64, "--format: pdf not in {html,trace}"),
+                (["report", self.record, "--format", "junit"], 64, "this command writes html and trace; for junit, "
+                 "'quazor analyze RECORD --output junit:FILE' judges the record again"),
                 (["report", self.record, "--from", "1"], 64, "--from applies only to --format trace"),
                 (["report", self.record, "--to", "1"], 64, "--to applies only to --format trace"),
                 (["report", self.record, "--format", "trace", "--no-frames"], 64, "--no-frames applies only to"),

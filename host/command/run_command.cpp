@@ -223,10 +223,8 @@ void requirePhone(const std::filesystem::path& file, const Options& options, con
                            didYouMeanOf(file.string(), "the installed bindings", installation.bindingNames()));
   }
   refuseGroupOfPhones(file.string(), ExitCode::kCannotRead, "--phone " + options.phone.string(), installation);
-  throw CommandError(ExitCode::kCannotRead, text +
-                                                "the file does not exist, and no installed phone has this name; "
-                                                "'quazor phone list' shows them, and one that is not installed is "
-                                                "given by its file");
+  throw CommandError(ExitCode::kCannotRead,
+                     text + "the file does not exist, and no installed phone has this name; " + kWayToPhones);
 }
 
 void addFilesOf(const std::vector<Profile>& profiles, std::vector<std::filesystem::path>& files) {
@@ -268,7 +266,7 @@ ExitCode runCommand(const Options& given, const Installation& installation, Cons
   const ChosenPhone phone = choosePhone(options, installation);
   options.bases = phone.bases;
   addFilesOf(selection.profiles, options.bases);
-  tellLimitsForOtherValues(selection.profiles, selection.diagnostics, console.err);
+  tellRemarks(selection, selection.diagnostics, console.err);
   std::vector<Job> jobs;
   for (ResolvedDiagnostic& one : selection.diagnostics) {
     std::optional<Skip> skip = skipOf(one.described.diagnostic.name, options.choice.skips);
@@ -381,7 +379,7 @@ ExitCode analyzeCommand(const Options& given, const Installation& installation, 
   runOptions.logLevel = options.logLevel.value_or(LogLevel::kDefault);
   runOptions.logLimit = options.logLimit;
   RunStarted began = beginningOf(options, installation, jobs, selection.failed);
-  tellLimitsForOtherValues(selection.profiles, rebound, console.err);
+  tellRemarks(selection, rebound, console.err);
   began.phone = run.began.phone;
   began.seed = run.began.seed;
   began.analyzed = run.began.analyzed.value_or(AnalyzedRun{run.began.id, run.began.date, run.began.host});

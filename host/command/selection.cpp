@@ -15,6 +15,7 @@
 
 #include <algorithm>
 #include <cstddef>
+#include <iterator>
 #include <optional>
 #include <system_error>
 #include <utility>
@@ -57,12 +58,10 @@ void leaveOut(const std::string& pattern, bool mayBeNone, std::vector<Diagnostic
   throw CommandError(ExitCode::kUsage, "--except '" + pattern + "' fits nothing of what is selected to run");
 }
 
-// Adds the profile in the file, after those that it is based on. Those in the folders of profiles serve any set of
-// plug-ins, and so does what they are based on.
-void addProfile(const std::filesystem::path& file, bool isNamedByPath, const Installation& installation,
-                std::vector<Profile>& profiles) {
+// Adds the profile in the file, after those that it is based on. The installed ones serve any set of plug-ins.
+void addProfile(const std::filesystem::path& file, const Installation& installation, std::vector<Profile>& profiles) {
   for (Profile& one : readProfileAndBases(file, installation.profileSource())) {
-    one.mayNameOthers = !isNamedByPath || one.file != file;
+    one.mayNameOthers = installation.isInstalledProfile(one.file);
     profiles.push_back(std::move(one));
   }
 }
@@ -77,29 +76,74 @@ void addChosenProfile(const std::filesystem::path& name, const Installation& ins
                        name.string() + ": the file does not exist" +
                            didYouMeanOf(name.string(), "the installed profiles", installation.profileNames()));
   }
-  addProfile(file, file == name, installation, profiles);
+  addProfile(file, installation, profiles);
 }
 
-// Refuses a wrong profile, and says what to do if only an entry for what is not loaded is wrong.
-void checkProfileToRun(const Profile& profile, const std::vector<DescribedDiagnostic>& catalogue) {
+[[noreturn]] void refuseInterrupted() {
+  throw CommandError(ExitCode::kInterrupted, "interrupted while loading the plug-ins");
+}
+
+// What the installed plug-ins have that are not loaded; nothing if one of them could not be asked.
+std::optional<std::vector<Diagnostic>> diagnosticsOfOthers(const Options& options, const Installation& installation,
+                                                           WatchedSignals* signals) {
+  std::vector<Diagnostic> diagnostics;
+  // The loaded plug-ins may have started threads, so that no process can be made.
+  if (options.inProcess) return diagnostics;
+  const PluginScan scan = scanOfOthers(options, installation, signals);
+  if (scan.interrupted) refuseInterrupted();
+  for (const DescribedDiagnostic& one : scan.catalogue) diagnostics.push_back(one.diagnostic);
+  return scan.failed.empty() ? std::optional(std::move(diagnostics)) : std::nullopt;
+}
+
+// Checks a profile with an entry that fits nothing that is loaded. If that is its only mistake, it is refused with what
+// to do, or a remark is returned if it `isOnlyTold`. Returns an empty text if others have what the entries are for.
+std::string remarkOnUnmatched(Profile profile, bool isOnlyTold, const std::vector<DescribedDiagnostic>& catalogue,
+                              const std::vector<Diagnostic>& others) {
+  profile.mayNameOthers = false;
   try {
-    checkProfile(profile, catalogue);
+    checkProfile(profile, catalogue, others);
   } catch (const CommandError& problem) {
-    if (profile.mayNameOthers) throw;
-    Profile lenient = profile;
-    lenient.mayNameOthers = true;
-    checkProfile(lenient, catalogue);
+    profile.mayNameOthers = true;
+    checkProfile(profile, catalogue);
+    if (isOnlyTold) return problem.what();
     throw CommandError(problem.code(),
-                       problem.what() + std::string(" Only a profile in a folder of profiles may have entries for "
-                                                    "plug-ins that are not loaded: load the plug-in with --plugin, "
-                                                    "remove the entry, or put the file there and give its name."));
+                       problem.what() + std::string(" An entry must be for a plug-in that is loaded or installed: "
+                                                    "correct the name, remove the entry, or load the plug-in with "
+                                                    "--plugin."));
   }
+  return {};
+}
+
+// Checks the profiles, and returns the remarks on them. An installed one has entries for plug-ins that are loaded only
+// when they are named, so that of it only what seems misspelt is looked for in them; with --plugin or a hidden plug-in,
+// it may have entries for what is not loaded. A plug-in that could not be asked may have what an entry is for.
+std::vector<std::string> checkProfilesToRun(const std::vector<Profile>& profiles, const Options& options,
+                                            const Installation& installation, const PluginScan& loaded,
+                                            WatchedSignals* signals) {
+  std::vector<std::string> remarks;
+  std::optional<std::optional<std::vector<Diagnostic>>> asked;  // once, for all profiles
+  for (const Profile& one : profiles) {
+    const bool isExpected = one.mayNameOthers && (!options.plugins.empty() || !installation.hiddenPlugins().empty());
+    const bool isInDoubt =
+        loaded.failed.empty() && !isExpected && namesOthers(one, loaded.catalogue, one.mayNameOthers);
+    if (isInDoubt && !asked) asked = diagnosticsOfOthers(options, installation, signals);
+    if (isInDoubt && *asked) {
+      // Not every user can change an installed one, and with --in-process the other plug-ins are not asked.
+      std::string remark = remarkOnUnmatched(one, one.mayNameOthers || options.inProcess, loaded.catalogue, **asked);
+      if (!remark.empty()) remarks.push_back(std::move(remark));
+    } else {
+      Profile lenient = one;
+      lenient.mayNameOthers = true;
+      checkProfile(lenient, loaded.catalogue);
+    }
+  }
+  return remarks;
 }
 
 std::vector<Profile> profilesOf(const Options& options, const Installation& installation) {
   std::vector<Profile> profiles;
   if (!options.withoutProfile && options.profile.empty()) {
-    addProfile(installation.defaultProfile(), false, installation, profiles);
+    addProfile(installation.defaultProfile(), installation, profiles);
     // The record has all limits of its run, those of that run's default profile, too.
     if (options.recorded) {
       for (Profile& one : profiles) one.limits.clear();
@@ -123,10 +167,6 @@ std::string hintOfHiddenDefault(const Diagnostic& diagnostic, const Installation
     return matchesName(entry.name, diagnostic.name);
   });
   return hasEntry ? "; " + installation.defaultProfile().string() + " " + kHidesDefaultProfile : std::string();
-}
-
-[[noreturn]] void refuseInterrupted() {
-  throw CommandError(ExitCode::kInterrupted, "interrupted while loading the plug-ins");
 }
 
 // Requests the descriptions that are needed to check the profiles.
@@ -257,7 +297,7 @@ Selection select(const Options& options, const Installation& installation, Watch
   std::vector<Profile> profiles = profilesOf(options, installation);
   describeForProfiles(options, installation, profiles, described, signals);
   addExplainedRanges(installation.explanations(), described);
-  for (const Profile& profile : profiles) checkProfileToRun(profile, described);
+  std::vector<std::string> remarks = checkProfilesToRun(profiles, options, installation, scan, signals);
   std::vector<ParameterOverride> settings = overridesOfEnvironment();
   settings.insert(settings.end(), options.settings.begin(), options.settings.end());
   std::vector<DescribedDiagnostic> selected;
@@ -268,7 +308,7 @@ Selection select(const Options& options, const Installation& installation, Watch
     }
   }
   if (!selected.empty()) checkOverrides(settings, selected);
-  Selection selection{{}, std::move(scan.failed), limitsOf(profiles), {}};
+  Selection selection{{}, std::move(scan.failed), limitsOf(profiles), {}, std::move(remarks)};
   selection.limits.insert(selection.limits.end(), options.limits.begin(), options.limits.end());
   for (DescribedDiagnostic& one : selected) {
     ResolvedParameters parameters = resolveParameters(one, profiles, settings);
@@ -278,11 +318,13 @@ Selection select(const Options& options, const Installation& installation, Watch
   return selection;
 }
 
-void tellLimitsForOtherValues(const std::vector<Profile>& profiles, const std::vector<ResolvedDiagnostic>& selected,
-                              std::ostream& err) {
-  for (const Profile& profile : profiles) {
-    for (const std::string& one : limitsForOtherValues(profile, selected)) err << "quazor: " << printable(one) << '\n';
+void tellRemarks(const Selection& selection, const std::vector<ResolvedDiagnostic>& selected, std::ostream& err) {
+  std::vector<std::string> remarks = selection.remarks;
+  for (const Profile& profile : selection.profiles) {
+    std::vector<std::string> more = limitsForOtherValues(profile, selected);
+    std::move(more.begin(), more.end(), std::back_inserter(remarks));
   }
+  for (const std::string& one : remarks) err << "quazor: " << printable(one) << '\n';
 }
 
 std::filesystem::path hiddenDefaultProfile(const Installation& installation) {
@@ -326,7 +368,7 @@ std::vector<std::string> wantedScenarios(const std::vector<std::string>& names, 
     if (found) continue;
     refuseGroupOfPhones(name, ExitCode::kUsage, name, installation);
     std::string wayOut = didYouMeanPath(name, all);
-    if (wayOut.empty()) wayOut = "; 'quazor phone list' shows them, and one that is not installed is given by its file";
+    if (wayOut.empty()) wayOut = std::string("; ") + kWayToPhones;
     throw CommandError(ExitCode::kUsage, formatMessage("no installed phone is called '%@'%@", name, wayOut));
   }
   return wanted;

@@ -19,6 +19,7 @@ struct Selection {
   std::vector<FailedPlugin> failed;  // could not be loaded
   std::vector<UserLimit> limits;     // of the profiles and the command line, in this order
   std::vector<Profile> profiles;     // of which these limits and the values of parameters are
+  std::vector<std::string> remarks;  // on entries of installed profiles that fit nothing
 };
 
 // The plug-ins that the options name, or those that are loaded by default, and the limits of their processes.
@@ -55,9 +56,8 @@ PluginScan scanForSelection(const Options& options, const Installation& installa
 // plug-in could not be loaded, because that plug-in may define it.
 Selection select(const Options& options, const Installation& installation, WatchedSignals* signals = nullptr);
 
-// Tells the limitsForOtherValues() of the profiles.
-void tellLimitsForOtherValues(const std::vector<Profile>& profiles, const std::vector<ResolvedDiagnostic>& selected,
-                              std::ostream& err);
+// Tells the remarks, and the limitsForOtherValues() of the profiles.
+void tellRemarks(const Selection& selection, const std::vector<ResolvedDiagnostic>& selected, std::ostream& err);
 
 // What a user's own default profile does that is based on nothing: the end of a sentence about it.
 inline constexpr const char* kHidesDefaultProfile =

@@ -8,6 +8,7 @@
 
 #include <algorithm>
 #include <iterator>
+#include <optional>
 
 namespace quazor {
 
@@ -15,25 +16,10 @@ namespace {
 
 bool fits(const std::string& name, const Diagnostic& one) { return matchesName(name, one.name); }
 
-// What the plug-ins have that are loaded only when they are named.
-std::vector<DescribedDiagnostic> loadedOnlyWhenNamed(const Options& options, const Installation& installation) {
-  IsolationOptions isolation = isolationOf(options, installation);
-  const std::vector<std::filesystem::path> byDefault = isolation.plugins;
-  isolation.plugins = installation.allPlugins();
-  isolation.unasked = true;
-  std::erase_if(isolation.plugins, [&byDefault](const std::filesystem::path& one) {
-    return std::find(byDefault.begin(), byDefault.end(), one) != byDefault.end();
-  });
-  if (isolation.plugins.empty()) return {};
-  WatchedSignals signals;
-  return scanPlugins(isolation, signals, [](const std::vector<Diagnostic>&) { return std::vector<Diagnostic>(); })
-      .catalogue;
-}
-
 void refuseNameOfUnloaded(const std::string& name, const Options& options, const Installation& installation) {
   // With --in-process, plug-ins may have started threads, so that no process can be made.
   if (!options.plugins.empty() || options.inProcess) return;
-  for (const DescribedDiagnostic& described : loadedOnlyWhenNamed(options, installation)) {
+  for (const DescribedDiagnostic& described : scanOfOthers(options, installation).catalogue) {
     const Diagnostic& one = described.diagnostic;
     if (!fits(name, one) || one.plugins.empty()) continue;
     const bool runs = options.command == Command::kRun || options.command == Command::kExperiment;
@@ -50,6 +36,20 @@ void refuseNameOfUnloaded(const std::string& name, const Options& options, const
 }
 
 }  // namespace
+
+PluginScan scanOfOthers(const Options& options, const Installation& installation, WatchedSignals* signals) {
+  IsolationOptions isolation = isolationOf(options, installation);
+  const std::vector<std::filesystem::path> loaded = isolation.plugins;
+  isolation.plugins = installation.allPlugins();
+  isolation.unasked = true;
+  std::erase_if(isolation.plugins, [&loaded](const std::filesystem::path& one) {
+    return std::find(loaded.begin(), loaded.end(), one) != loaded.end();
+  });
+  if (isolation.plugins.empty()) return {};
+  std::optional<WatchedSignals> own;
+  if (signals == nullptr) signals = &own.emplace();
+  return scanPlugins(isolation, *signals, [](const std::vector<Diagnostic>&) { return std::vector<Diagnostic>(); });
+}
 
 void refusePhoneAsName(const std::string& name, const Installation& installation) {
   const std::vector<std::string> phones = installation.scenarioNames();

@@ -186,6 +186,13 @@ std::size_t warningsIn(const std::vector<LimitCheck>& checks) {
       std::count_if(checks.begin(), checks.end(), [](const LimitCheck& one) { return one.warns(); }));
 }
 
+void addBounds(const std::optional<QZLimit>& limit, std::vector<double>& thresholds) {
+  if (!limit) return;
+  for (const auto& bound : {limit->lowerBound(), limit->upperBound()}) {
+    if (bound != nullptr) thresholds.push_back(bound->value().value());
+  }
+}
+
 std::optional<QZLimit> boundsOf(const LimitCheck& check) {
   if (std::holds_alternative<RelationCondition>(check.limit.condition)) return std::nullopt;
   QZLimit bounds(labelOf(check.limit));

@@ -67,6 +67,9 @@ std::size_t warningsIn(const std::vector<LimitCheck>& checks);
 // are finite.
 std::optional<QZLimit> boundsOf(const LimitCheck& check);
 
+// Adds the bounds that the limit has.
+void addBounds(const std::optional<QZLimit>& limit, std::vector<double>& thresholds);
+
 // The limits that fit no result in any of the records. Not those that are meant for a diagnostic that ended in an
 // error, because the run is one then. A limit of a profile is not one of them if all diagnostics for which it is meant
 // were skipped, or none of them was selected.

@@ -56,7 +56,7 @@ struct Profile {
   std::string kind = "profile";             // a user-readable name of the kind of file
   std::vector<UserLimit> limits{};          // in the order of the file
   std::string base{};                       // as the file has it; empty: none
-  bool mayNameOthers = false;               // an entry may name a diagnostic that no loaded plug-in has
+  bool mayNameOthers = false;               // an entry may name a diagnostic that no plug-in has
   // The text of the file, for the lines of mistakes; null for values that do not come from a profile.
   std::shared_ptr<const JsonDocument> document{};
   FirstMistake mistakes{};  // of the form, if they were not thrown

@@ -1,6 +1,7 @@
 #include "host/plugin/profile_check.h"
 
 #include "base/json/json_cursor.h"
+#include "base/text/nearest_name.h"
 #include "contract/message_format.h"
 #include "host/error/exit_code.h"
 #include "host/text/name_pattern.h"
@@ -46,22 +47,34 @@ void checkParameters(const Profile& profile, const ProfileEntry& entry, Part par
   }
 }
 
+bool matches(const ProfileEntry& entry, const Diagnostic& one) {
+  return one.experimentOnly == entry.ofExperiment && matchesName(entry.name, one.name);
+}
+
 // The diagnostics or experiments that the entry matches.
 std::vector<DescribedDiagnostic> matchesOf(const ProfileEntry& entry,
                                            const std::vector<DescribedDiagnostic>& catalogue) {
   std::vector<DescribedDiagnostic> matched;
-  for (const DescribedDiagnostic& one : catalogue) {
-    const bool fits = matchesName(entry.name, one.diagnostic.name);
-    if (fits && one.diagnostic.experimentOnly == entry.ofExperiment) matched.push_back(one);
-  }
+  std::copy_if(catalogue.begin(), catalogue.end(), std::back_inserter(matched),
+               [&entry](const DescribedDiagnostic& one) { return matches(entry, one.diagnostic); });
   return matched;
 }
 
-[[noreturn]] void failUnmatched(const Profile& profile, const ProfileEntry& entry,
-                                const std::vector<DescribedDiagnostic>& catalogue) {
+// The names of the diagnostics or, for an entry of an experiment, of the experiments.
+std::vector<std::string> namesLike(const ProfileEntry& entry, const std::vector<DescribedDiagnostic>& catalogue) {
   std::vector<std::string> names;
   for (const DescribedDiagnostic& one : catalogue) {
     if (one.diagnostic.experimentOnly == entry.ofExperiment) names.push_back(one.diagnostic.name);
+  }
+  return names;
+}
+
+[[noreturn]] void failUnmatched(const Profile& profile, const ProfileEntry& entry,
+                                const std::vector<DescribedDiagnostic>& catalogue,
+                                const std::vector<Diagnostic>& others) {
+  std::vector<std::string> names = namesLike(entry, catalogue);
+  for (const Diagnostic& one : others) {
+    if (one.experimentOnly == entry.ofExperiment) names.push_back(one.name);
   }
   const std::string noun = entry.ofExperiment ? "experiment" : "diagnostic";
   fail(profile, Profile::pathOf(entry),
@@ -70,9 +83,11 @@ std::vector<DescribedDiagnostic> matchesOf(const ProfileEntry& entry,
 }
 
 void checkEntry(const Profile& profile, const ProfileEntry& entry, const std::vector<DescribedDiagnostic>& catalogue,
-                FirstMistake& mistakes) {
+                const std::vector<Diagnostic>& others, FirstMistake& mistakes) {
   const std::vector<DescribedDiagnostic> matched = matchesOf(entry, catalogue);
-  if (matched.empty() && !profile.mayNameOthers) failUnmatched(profile, entry, catalogue);
+  const bool isOfOthers =
+      std::any_of(others.begin(), others.end(), [&entry](const Diagnostic& one) { return matches(entry, one); });
+  if (matched.empty() && !isOfOthers && !profile.mayNameOthers) failUnmatched(profile, entry, catalogue, others);
   const bool allDescribed = std::all_of(matched.begin(), matched.end(), [](const DescribedDiagnostic& one) {
     return one.description.isAsked && one.description.error == nullptr;
   });
@@ -123,9 +138,10 @@ void addDiagnosticsToDescribe(const ProfileEntry& entry, const std::vector<Descr
 
 }  // namespace
 
-void checkProfile(const Profile& profile, const std::vector<DescribedDiagnostic>& catalogue) {
+void checkProfile(const Profile& profile, const std::vector<DescribedDiagnostic>& catalogue,
+                  const std::vector<Diagnostic>& others) {
   FirstMistake mistakes = profile.mistakes;
-  const auto check = [&](const ProfileEntry& entry) { checkEntry(profile, entry, catalogue, mistakes); };
+  const auto check = [&](const ProfileEntry& entry) { checkEntry(profile, entry, catalogue, others, mistakes); };
   mistakes.inOrder(profile.entries, check);
   mistakes.inOrder(profile.experiments, check);
   for (const DescribedDiagnostic& one : catalogue) checkRanges(profile, one, mistakes);
@@ -134,6 +150,15 @@ void checkProfile(const Profile& profile, const std::vector<DescribedDiagnostic>
   } catch (const DocumentError& first) {
     throw CommandError(ExitCode::kCannotRead, first.what());
   }
+}
+
+bool namesOthers(const Profile& profile, const std::vector<DescribedDiagnostic>& catalogue, bool onlyMisspelt) {
+  const auto isOfOthers = [&](const ProfileEntry& entry) {
+    return matchesOf(entry, catalogue).empty() &&
+           (!onlyMisspelt || nearestName(entry.name, namesLike(entry, catalogue)).has_value());
+  };
+  return std::any_of(profile.entries.begin(), profile.entries.end(), isOfOthers) ||
+         std::any_of(profile.experiments.begin(), profile.experiments.end(), isOfOthers);
 }
 
 std::vector<Diagnostic> diagnosticsToDescribe(const Profile& profile,

@@ -190,6 +190,14 @@ TEST(CheckProfile, RefusesAnEntryThatFitsNoDiagnosticOnlyWhenAllMustExist) {
   Profile profile = profileWith(R"({"Sync.Bakc": {"experiment": {"duration": 3}}})");
   EXPECT_EQ(refusalOf(ExitCode::kCannotRead, [&] { checkProfile(profile, {sync()}); }),
             "dir/some.json:1: diagnostics.Sync.Bakc: no diagnostic has this name; did you mean \"Sync.Back\"?");
+  Diagnostic other;
+  other.name = "Other";
+  EXPECT_EQ(refusalOf(ExitCode::kCannotRead, [&] { checkProfile(profileWith(R"({"Othre": {}})"), {sync()}, {other}); }),
+            "dir/some.json:1: diagnostics.Othre: no diagnostic has this name; did you mean \"Other\"?");
+  other.name = "Sync.Bakc";
+  EXPECT_EQ(refusalOf(ExitCode::kCannotRead, [&] { checkProfile(profile, {sync()}, {other}); }), "accepted");
+  other.experimentOnly = true;
+  EXPECT_NE(refusalOf(ExitCode::kCannotRead, [&] { checkProfile(profile, {sync()}, {other}); }), "accepted");
   profile.mayNameOthers = true;
   EXPECT_EQ(refusalOf(ExitCode::kCannotRead, [&] { checkProfile(profile, {sync()}); }), "accepted");
 }

@@ -34,8 +34,9 @@ std::string textReport(const RunStarted& run, const std::vector<DiagnosticRecord
                        const std::optional<std::string>& interrupted, const TextContent& content) {
   std::ostringstream text;
   printRun(text, run);
+  ShownFailures shown;
   for (std::size_t i = 0; i < records.size(); ++i) {
-    printReport(text, run, records[i], {false, false, content.verbose});
+    printReport(text, run, records[i], {false, false, content.verbose}, shown);
     if (!content.verbose) printRepetitionEnd(text, records, i + 1);
   }
   printEnd(text, run, records, interrupted, content, false);
@@ -100,7 +101,7 @@ OutputRequest parseOutput(const std::string& text, Format usual) {
   if (colon == std::string::npos || !isWord) return {usual, text};
   throw CommandError(ExitCode::kUsage, "--output '" + text + "': unknown format '" + word +
                                            "' (for a file of this name, write './" + text + "')" +
-                                           didYouMean(word, formatNames()));
+                                           didYouMeanOf(word, "the formats", formatNames()));
 }
 
 void refuseNoFile(const std::string& text, const OutputRequest& output) {
@@ -163,7 +164,8 @@ std::string reportText(Format format, const RunStarted& run, const std::vector<D
   return documentText(document);
 }
 
-void printReport(std::ostream& out, const RunStarted& run, const DiagnosticRecord& record, TextStyle style) {
+void printReport(std::ostream& out, const RunStarted& run, const DiagnosticRecord& record, TextStyle style,
+                 ShownFailures& shown) {
   if (record.experimentOnly) {
     printExperiment(out, record, style);
   } else if (style.verbose) {
@@ -171,7 +173,7 @@ void printReport(std::ostream& out, const RunStarted& run, const DiagnosticRecor
   } else if (!isOnlyCounted(record)) {
     std::size_t nameWidth = 0;
     for (const std::string& name : run.names) nameWidth = std::max(nameWidth, widthOf(printable(name)));
-    printShortRecord(out, record, style.colour, nameWidth);
+    printShortRecord(out, record, style.colour, nameWidth, shown.add(record));
   }
 }
 
@@ -191,8 +193,11 @@ void printEnd(std::ostream& out, const RunStarted& run, const std::vector<Diagno
       !finished.empty() && !text.verbose && !run.ofExperiments && finished.back().trial.repetition > 0;
   if (endsWithRepetition) out << '\n';
   const std::vector<DiagnosticRecord> records = withInterruptedOfAnalysis(run, finished, interrupted);
-  if (records.size() > finished.size()) printReport(out, run, records.back(), {colour, false, text.verbose});
-  printVariation(out, records);
+  if (records.size() > finished.size()) {
+    ShownFailures none;
+    printReport(out, run, records.back(), {colour, false, text.verbose}, none);
+  }
+  printVariation(out, records, text.verbose);
   if (records.size() != 1 || interrupted) {
     const std::size_t notReached = interrupted ? unrecordedDiagnosticsOf(run, records, interrupted).neverRun.size() : 0;
     run.ofExperiments ? printExperimentSummary(out, records, notReached) : printSummary(out, records, notReached);

@@ -3,6 +3,7 @@
 
 #include "host/model/run_event.h"
 #include "host/record/record_file.h"
+#include "host/report/short_report.h"
 #include "host/report/text_report.h"
 
 #include <filesystem>
@@ -75,8 +76,10 @@ std::string reportText(Format format, const RunStarted& run, const std::vector<D
                        const std::optional<std::string>& interrupted, const TextContent& text = {},
                        const RunStreams& streams = {});
 
-// Prints the text report of one record of the run; nothing if that report only counts it (variation_report.h).
-void printReport(std::ostream& out, const RunStarted& run, const DiagnosticRecord& record, TextStyle style);
+// Prints the text report of one record of the run; nothing if that report only counts it (variation_report.h). `shown`
+// is about the records before.
+void printReport(std::ostream& out, const RunStarted& run, const DiagnosticRecord& record, TextStyle style,
+                 ShownFailures& shown);
 
 // Prints the end of the text report: of an analysis, the diagnostic in which the recorded run stopped; the number of
 // records per verdict, unless there is only one and the run was not interrupted, what passed without any

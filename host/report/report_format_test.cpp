@@ -5,6 +5,7 @@
 #include "host/record/value_json.h"
 #include "host/report/json_report.h"
 #include "host/report/run_identity.h"
+#include "host/report/variation_report.h"
 #include "host/testing/test_events.h"
 #include "host/testing/test_records.h"
 #include "host/testing/test_refusals.h"
@@ -13,6 +14,8 @@
 #include <gmock/gmock.h>
 #include <gtest/gtest.h>
 #include <nlohmann/json.hpp>
+
+#include <sstream>
 
 namespace quazor {
 namespace {
@@ -33,7 +36,9 @@ TEST(Formats, HaveNamesByWhichTheyAreFound) {
 TEST(ParseOutput, RefusesAWordBeforeAColonThatIsNoFormat) {
   EXPECT_EQ(refusalOf(ExitCode::kUsage, [] { parseOutput("jnuit:report", Format::kText); }),
             "--output 'jnuit:report': unknown format 'jnuit' (for a file of this name, write "
-            "'./jnuit:report'); did you mean 'junit'?");
+            "'./jnuit:report'); did you mean 'junit'? The formats are text, json, csv, ocp, junit, html, trace");
+  EXPECT_THAT(refusalOf(ExitCode::kUsage, [] { parseOutput("xml:report", Format::kText); }),
+              testing::EndsWith("; the formats are text, json, csv, ocp, junit, html, trace"));
 }
 
 TEST(ParseOutput, TakesAFormatBeforeAColon) {
@@ -150,6 +155,25 @@ TEST_F(ReportTextTest, HasWhatWasInterruptedInTheRecordOfAnAnalysis) {
   for (const Format format : {Format::kText, Format::kCsv}) {
     EXPECT_THAT(report(format, ""), testing::Not(HasSubstr("code 11"))) << nameOf(format);
   }
+}
+
+TEST(PrintVariation, RoundsNumbersButNotAcrossALimit) {
+  std::vector<DiagnosticRecord> records;
+  for (const double value : {90.0000000001, 33.33333333, 12.0}) {
+    DiagnosticRecord record = recordOf("A", Verdict::kPass);
+    record.trial = {0, 0, records.size() + 1, 3};
+    record.measuredResults = judgeResults({resultWithMinimum(value, 90)});
+    records.push_back(record);
+  }
+  const auto varied = [&records](bool whole) {
+    std::ostringstream out;
+    printVariation(out, records, whole);
+    return out.str();
+  };
+  EXPECT_THAT(varied(false), HasSubstr("  12  3  33.3333  90.0000000001  1  "));
+  EXPECT_THAT(varied(true), HasSubstr("  12  3  33.33333333  90.0000000001  1  "));
+  for (DiagnosticRecord& record : records) record.limits.push_back(parseUserLimit("Count <= 33.3333"));
+  EXPECT_THAT(varied(false), HasSubstr("  12  3  33.33333  90.0000000001  1  "));
 }
 
 }  // namespace

@@ -90,7 +90,7 @@ void RunReport::addRecord(DiagnosticRecord record) {
   if (!options_.output.empty()) {
     if (options_.text.verbose || !isOnlyCounted(record)) printVerdict(console_.out, record, console_.colour);
   } else if (options_.format == Format::kText) {
-    printReport(console_.out, run_, record, {console_.colour, console_.blocks, options_.text.verbose});
+    printReport(console_.out, run_, record, {console_.colour, console_.blocks, options_.text.verbose}, shown_);
   }
   console_.out.flush();
   // The CSV table of measurements has no column for errors.

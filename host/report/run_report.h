@@ -77,6 +77,7 @@ class RunReport final : public RunEventSink {
   const ReportOptions options_;
   Console& console_;
   Progress progress_;
+  ShownFailures shown_;
   RunStarted run_;
   std::string running_;     // the diagnostic that began last
   std::size_t number_ = 0;  // its place among those to run

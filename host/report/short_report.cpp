@@ -177,11 +177,24 @@ std::string resultCountsText(const DiagnosticRecord& record) {
   return text;
 }
 
-void printShortRecord(std::ostream& out, const DiagnosticRecord& record, bool colour, std::size_t nameWidth) {
-  const std::string more = record.skip ? printable(textOf(*record.skip)) : resultCountsText(record);
+Shown ShownFailures::add(const DiagnosticRecord& record) {
+  if (record.trial.repetition == 0 || record.verdict == Verdict::kPass) return Shown::kWhole;
+  const bool isNewKind = kinds_.emplace(record.name, std::string(nameOf(record.verdict)) + failureText(record)).second;
+  if (names_.insert(record.name).second) return Shown::kWhole;
+  return isNewKind ? Shown::kLine : Shown::kNothing;
+}
+
+void printShortRecord(std::ostream& out, const DiagnosticRecord& record, bool colour, std::size_t nameWidth,
+                      Shown shown) {
+  if (shown == Shown::kNothing) return;
+  std::string more = record.skip ? printable(textOf(*record.skip)) : resultCountsText(record);
+  if (shown == Shown::kLine) {
+    more = printable(failureText(record));
+    if (record.error != nullptr) more += ": " + printable(record.error->localizedDescription());
+  }
   const std::string trial = trialTextWithSeed(record);
   printVerdict(out, record, colour, trial + (trial.empty() || more.empty() ? "" : ", ") + more, nameWidth);
-  if (record.skip) return;
+  if (record.skip || shown == Shown::kLine) return;
   const bool passed = record.verdict == Verdict::kPass;
   std::ostringstream table;
   prepareFor(out, table);

@@ -6,7 +6,9 @@
 #include <cstddef>
 #include <functional>
 #include <ostream>
+#include <set>
 #include <string>
+#include <utility>
 #include <vector>
 
 namespace quazor {
@@ -14,9 +16,26 @@ namespace quazor {
 // "9 results, 2 with limits, 1 failed, 1 warning"; empty without results.
 std::string resultCountsText(const DiagnosticRecord& record);
 
+// How much of a record the report shows.
+enum class Shown { kWhole, kLine, kNothing };
+
+// Chooses what is shown of repetitions that did not pass at once: the first of a diagnostic whole, and of the others
+// one line for each kind of failure. What passed with a warning or after an error is shown whole.
+// Thread: one at a time.
+class ShownFailures {
+ public:
+  Shown add(const DiagnosticRecord& record);
+
+ private:
+  std::set<std::string> names_;
+  std::set<std::pair<std::string, std::string>> kinds_;  // names and failures
+};
+
 // Prints the verdict in one line with the number of results, the rows of results that are noteworthy
-// (text_report.h) and, unless the diagnostic passed, its summary and its error. The name is padded to `nameWidth`.
-void printShortRecord(std::ostream& out, const DiagnosticRecord& record, bool colour, std::size_t nameWidth);
+// (text_report.h) and, unless the diagnostic passed, its summary and its error; with kLine only the verdict
+// and what failed. The name is padded to `nameWidth`.
+void printShortRecord(std::ostream& out, const DiagnosticRecord& record, bool colour, std::size_t nameWidth,
+                      Shown shown = Shown::kWhole);
 
 // What to ask `quazor explain` about a diagnostic that did not pass, the most specific first: its error, or its results
 // that failed, and then its name.

@@ -66,6 +66,36 @@ TEST(PrintShortRecord, ShowsTheRowsThatFailOrHaveALimitOfTheUser) {
             "\n");
 }
 
+TEST(ShownFailures, AreTheFirstRepetitionOfADiagnosticWholeAndALineForEachOtherKind) {
+  ShownFailures shown;
+  const auto add = [&shown](const char* name, Verdict verdict, std::uint64_t repetition) {
+    DiagnosticRecord record = recordOf(name, verdict);
+    record.trial.repetition = repetition;
+    return shown.add(record);
+  };
+  EXPECT_EQ(add("A", Verdict::kFail, 1), Shown::kWhole);
+  EXPECT_EQ(add("B", Verdict::kFail, 1), Shown::kWhole) << "each diagnostic has a first one";
+  EXPECT_EQ(add("A", Verdict::kFail, 2), Shown::kNothing);
+  EXPECT_EQ(add("A", Verdict::kError, 3), Shown::kLine);
+  EXPECT_EQ(add("A", Verdict::kError, 4), Shown::kNothing);
+  EXPECT_EQ(add("A", Verdict::kPass, 5), Shown::kWhole) << "it has a warning";
+  EXPECT_EQ(add("A", Verdict::kPass, 6), Shown::kWhole);
+  EXPECT_EQ(add("A", Verdict::kFail, 0), Shown::kWhole) << "without repetitions everything is shown";
+}
+
+TEST(PrintShortRecord, IsALineWithTheFailureIfItIsOfAnotherKind) {
+  const auto lineOf = [](DiagnosticRecord record, Shown shown) {
+    record.trial.repetition = 2;
+    std::ostringstream out;
+    printShortRecord(out, record, false, 0, shown);
+    return out.str();
+  };
+  EXPECT_EQ(lineOf(recordOf("A", Verdict::kFail), Shown::kLine), "FAIL  A  repetition 2, seed 7, Count\n");
+  EXPECT_EQ(lineOf(recordOf("A", Verdict::kError), Shown::kLine),
+            "ERROR A  repetition 2, seed 7, Domain code -1: it failed\n");
+  EXPECT_EQ(lineOf(recordOf("A", Verdict::kFail), Shown::kNothing), "");
+}
+
 TEST(PrintShortRecord, ShowsTheErrorAndItsCause) {
   DiagnosticRecord record = recordOf("A", Verdict::kError);
   record.measuredResults.clear();

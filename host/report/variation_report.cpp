@@ -7,13 +7,16 @@
 #include "host/record/value_json.h"
 #include "host/report/json_report.h"
 #include "host/report/text_report.h"
+#include "host/text/number_text.h"
 #include "host/text/table.h"
 
 #include <algorithm>
 #include <cstddef>
 #include <cstdint>
+#include <functional>
 #include <string_view>
 #include <utility>
+#include <variant>
 
 namespace quazor {
 
@@ -51,15 +54,30 @@ Json repetitionJson(std::uint64_t repetition) { return repetition == 0 ? Json() 
 
 std::string repetitionText(std::uint64_t repetition) { return repetition == 0 ? "-" : std::to_string(repetition); }
 
-void printVarying(std::ostream& out, const std::vector<VaryingResult>& results) {
+// The rule for a number of the result: rounded for people, but on the same side of its limits. What a limit compares
+// with another result is shown whole.
+std::function<std::string(double)> numberTextOf(const VaryingResult& one, bool whole) {
+  std::vector<double> thresholds;
+  addBounds(one.limit, thresholds);
+  for (const UserLimit& limit : one.userLimits) {
+    const LimitCheck check{limit,
+                           QZMeasuredResult(one.name, Measurement(one.median, QZUnit::unitWithSymbol(one.unit)))};
+    whole = whole || std::holds_alternative<RelationCondition>(limit.condition);
+    addBounds(boundsOf(check), thresholds);
+  }
+  if (whole) return [](double value) { return defaultText(value); };
+  return [thresholds = std::move(thresholds)](double value) { return shownNumber(value, thresholds); };
+}
+
+void printVarying(std::ostream& out, const std::vector<VaryingResult>& results, bool whole) {
   using Align = Table::Align;
   Table table({Align::kLeft, Align::kRight, Align::kRight, Align::kRight, Align::kRight, Align::kRight, Align::kRight,
                Align::kRight, Align::kRight, Align::kLeft, Align::kLeft});
   table.addHeader({"Result", "Count", "Minimum", "#", "Median", "Maximum", "#", "Outlier", "Seed", "Unit", "Limit"});
   for (const VaryingResult& one : results) {
-    const auto addRow = [&table, &one](const std::string& limit) {
-      table.addRow({printable(one.name), std::to_string(one.values), defaultText(one.minimum),
-                    repetitionText(one.minimumRepetition), defaultText(one.median), defaultText(one.maximum),
+    const auto addRow = [&table, &one, text = numberTextOf(one, whole)](const std::string& limit) {
+      table.addRow({printable(one.name), std::to_string(one.values), text(one.minimum),
+                    repetitionText(one.minimumRepetition), text(one.median), text(one.maximum),
                     repetitionText(one.maximumRepetition), repetitionText(one.outlierRepetition),
                     one.outlierRepetition == 0 ? "-" : std::to_string(one.outlierSeed), printable(one.unit), limit});
     };
@@ -103,7 +121,7 @@ void printRepetitionEnd(std::ostream& out, const std::vector<DiagnosticRecord>& 
       << countsText(verdictCountsOf(records, last.repetition), false) << '\n';
 }
 
-void printVariation(std::ostream& out, const std::vector<DiagnosticRecord>& records) {
+void printVariation(std::ostream& out, const std::vector<DiagnosticRecord>& records, bool whole) {
   const std::vector<DiagnosticVariation> variations = variationOf(records);
   if (variations.empty()) return;
   const bool ofExperiments = records.back().experimentOnly;
@@ -115,7 +133,7 @@ void printVariation(std::ostream& out, const std::vector<DiagnosticRecord>& reco
                        : ":\n");
   for (const DiagnosticVariation& one : variations) {
     out << printable(one.name) << ": " << countsText(one.verdicts, ofExperiments) << '\n';
-    if (!one.varying.empty()) printVarying(out, one.varying);
+    if (!one.varying.empty()) printVarying(out, one.varying, whole);
     const std::size_t all = one.varying.size() + one.constant;
     if (one.constant > 0) {
       const std::string what = ofExperiments ? "measurement" : "result";

@@ -26,8 +26,9 @@ bool isOnlyCounted(const DiagnosticRecord& record);
 // diagnostics.
 void printRepetitionEnd(std::ostream& out, const std::vector<DiagnosticRecord>& records, std::size_t end);
 
-// Prints how often each diagnostic passed, and a table of its results that varied; nothing if nothing was repeated.
-void printVariation(std::ostream& out, const std::vector<DiagnosticRecord>& records);
+// Prints how often each diagnostic passed, and a table of its results that varied, with rounded numbers
+// unless they are to be `whole`; nothing if nothing was repeated.
+void printVariation(std::ostream& out, const std::vector<DiagnosticRecord>& records, bool whole);
 
 // The same for one JSON document; an array.
 nlohmann::ordered_json variationJson(const std::vector<DiagnosticRecord>& records);

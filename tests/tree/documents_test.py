@@ -38,7 +38,8 @@ def documents(root):
 
 def lay_out(directory, root, program, plugins):
     """Makes the directory look like a built tree. Returns the environment for commands in it."""
-    (directory / "data").symlink_to(root / "data")
+    for name in ("data", "examples"):
+        (directory / name).symlink_to(root / name)
     (directory / "run").write_text(RUN)
     (directory / "run").chmod(0o755)
     (directory / "my_phone.json").write_text('{"base": "data/scenarios/healthy.json", "title": "My phone"}\n')

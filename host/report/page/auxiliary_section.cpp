@@ -2,7 +2,6 @@
 
 #include "host/report/page/html.h"
 #include "host/report/page/plot.h"
-#include "host/report/page/shown_number.h"
 #include "host/report/sample_images.h"
 #include "host/text/table.h"
 

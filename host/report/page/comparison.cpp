@@ -6,8 +6,8 @@
 #include "host/report/page/frames_section.h"
 #include "host/report/page/html.h"
 #include "host/report/page/run_facts.h"
-#include "host/report/page/shown_number.h"
 #include "host/report/record_difference.h"
+#include "host/text/number_text.h"
 #include "host/text/table.h"
 
 #include <algorithm>

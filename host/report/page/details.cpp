@@ -1,7 +1,6 @@
 #include "host/report/page/details.h"
 
 #include "host/report/page/html.h"
-#include "host/report/page/shown_number.h"
 #include "host/text/number_text.h"
 #include "host/text/table.h"
 #include "host/text/timestamp.h"

@@ -78,6 +78,14 @@ std::string coordinate(double value) {
 
 std::string roundedText(double value) { return significantDigits(value, 6); }
 
+std::string numberCell(double value, const std::vector<double>& thresholds, std::string_view attributes) {
+  const std::string shown = shownNumber(value, thresholds);
+  const std::string whole = defaultText(value);
+  std::string tag = "td class=\"number\"" + std::string(attributes);
+  if (shown != whole) tag += " title=\"" + whole + "\"";
+  return element(tag, shown);
+}
+
 std::string heading(int level, std::string_view content) { return element("h" + std::to_string(level), content); }
 
 }  // namespace quazor

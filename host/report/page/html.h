@@ -5,6 +5,7 @@
 #include <functional>
 #include <string>
 #include <string_view>
+#include <vector>
 
 namespace quazor {
 
@@ -38,6 +39,10 @@ std::string coordinate(double value);
 
 // A number with six significant digits, for what was calculated from results.
 std::string roundedText(double value);
+
+// A cell with shownNumber() (host/text/number_text.h), and the whole number as its title if it is another. The
+// attributes begin with a blank.
+std::string numberCell(double value, const std::vector<double>& thresholds = {}, std::string_view attributes = {});
 
 // A heading; level 1 is that of the page.
 std::string heading(int level, std::string_view content);

@@ -47,5 +47,10 @@ TEST(Coordinate, HasAtMostOneDecimal) {
   EXPECT_EQ(coordinate(-0.01), "0");
 }
 
+TEST(NumberCell, HasTheWholeNumberAsTitle) {
+  EXPECT_EQ(numberCell(33.333334), "<td class=\"number\" title=\"33.333334\">33.3333</td>");
+  EXPECT_EQ(numberCell(3, {}, " rowspan=\"2\""), "<td class=\"number\" rowspan=\"2\">3</td>");
+}
+
 }  // namespace
 }  // namespace quazor

@@ -4,8 +4,8 @@
 #include "host/model/limit_check.h"
 #include "host/report/page/html.h"
 #include "host/report/page/limit_bar.h"
-#include "host/report/page/shown_number.h"
 #include "host/report/text_report.h"
+#include "host/text/number_text.h"
 
 #include <algorithm>
 #include <cstddef>
@@ -39,13 +39,6 @@ struct Group {
   std::vector<double> thresholds;  // of all its limits
   bool isWhole = false;            // the value is not rounded
 };
-
-void addBounds(const std::optional<QZLimit>& limit, std::vector<double>& thresholds) {
-  if (!limit) return;
-  for (const auto& bound : {limit->lowerBound(), limit->upperBound()}) {
-    if (bound != nullptr) thresholds.push_back(bound->value().value());
-  }
-}
 
 // True if a limit of the user compares the result with another one. Both are shown whole, so that they can be compared.
 bool isCompared(const QZMeasuredResult& result, const std::vector<LimitCheck>& checks) {

@@ -224,7 +224,7 @@ std::string diagnosticSection(const ShownRun& run, std::size_t number, std::size
 
 std::string variationOf(const ShownRun& run) {
   std::ostringstream text;
-  printVariation(text, run.records);
+  printVariation(text, run.records, false);
   return text.view().empty() ? std::string() : element("pre", htmlLines(text.view()));
 }
 
