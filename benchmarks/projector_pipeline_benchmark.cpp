@@ -4,6 +4,7 @@
 #include "backends/threads/thread_concurrency.h"
 #include "benchmarks/projector_pipeline_peer.h"
 #include "diagnostics/projector_fault/tessel_fault_experiment.h"
+#include "host/device/frame_rings.h"
 #include "tests/support/fake_camera.h"
 
 #include <benchmark/benchmark.h>
@@ -168,6 +169,51 @@ void handler(benchmark::State& state, std::chrono::microseconds pause) {
   state.counters["p99_ns"] = quantile(samples, 0.99);
 }
 
+// The intake of a frame each millisecond: how long it blocks the camera, told to the record or not. Frames of both
+// kinds take turns in small groups, so that whatever else the machine does slows both alike.
+void intake(benchmark::State& state) {
+  constexpr std::uint64_t kGroup = 32;
+  const auto frames = static_cast<std::uint64_t>(state.max_iterations);
+  FrameRings rings(0);
+  FrameDrain drain(rings);
+  const auto clock = std::make_shared<RealClock>();
+  rings.begin(clock->now());
+  const std::shared_ptr<TracedStream> traced = rings.addStream("camera", clock, WhenTraceIsFull::kLose);
+  StreamingExperiment run(frames);
+  BufferPool pool;
+  std::array<std::vector<double>, 2> samples;  // in nanoseconds: not told, told
+  for (auto& kind : samples) kind.reserve(frames);
+  std::uint64_t told = 0;
+  const FrameDrain::Take take = [&told](std::size_t, const TracedFrame&, std::uint64_t) { ++told; };
+  {
+    const Saturation saturation(run.processing());
+    std::uint64_t frame = 0;
+    for (auto _ : state) {
+      const bool isTold = frame / kGroup % 2 == 1;
+      PixelBuffer& buffer = pool.next();
+      const MediaTime time = timeOf(++frame);
+      const SteadyClock::time_point called = SteadyClock::now();
+      const TracedDelivery delivery(isTold ? traced : nullptr, frame, std::chrono::nanoseconds(0));
+      run.handleFrame(buffer, time);
+      const std::chrono::duration<double> taken = SteadyClock::now() - called;
+      state.SetIterationTime(taken.count());
+      samples[isTold ? 1 : 0].push_back(taken.count() * 1e9);
+      delivery.handBack();  // where the diagnostic lets go of the frame, which is not the camera's thread
+      if (frame % kGroup == 0) drain.drain(false, take);
+      std::this_thread::sleep_for(std::chrono::milliseconds(1));
+    }
+  }
+  run.waitForEnd();
+  drain.drain(true, take);
+  check(state, run.failed(), pool);
+  if (told != samples[1].size()) state.SkipWithError("frames are missing");
+  for (auto& kind : samples) std::sort(kind.begin(), kind.end());
+  state.counters["off_median_ns"] = quantile(samples[0], 0.5);
+  state.counters["on_median_ns"] = quantile(samples[1], 0.5);
+  state.counters["off_p99_ns"] = quantile(samples[0], 0.99);
+  state.counters["on_p99_ns"] = quantile(samples[1], 0.99);
+}
+
 constexpr std::uint64_t kBurst = 100'000;
 
 // From the first frame's handler to the end of the run, which the last frame causes.
@@ -242,6 +288,7 @@ BENCHMARK_CAPTURE(handler, with a pause, std::chrono::microseconds(1'000))
     ->Name("handler/every millisecond")
     ->Iterations(500)
     ->UseManualTime();
+BENCHMARK(intake)->Name("intake/every millisecond")->Iterations(4'000)->UseManualTime();
 BENCHMARK(framesOfTheExperiment)->Name("frames/quazor")->Iterations(5)->UseManualTime()->Unit(benchmark::kMillisecond);
 BENCHMARK(framesOfAsio)->Name("frames/asio strands")->Iterations(5)->UseManualTime()->Unit(benchmark::kMillisecond);
 BENCHMARK(memory)->Name("memory/an hour of frames")->Iterations(1)->Unit(benchmark::kMillisecond);

@@ -154,6 +154,12 @@ def check_pipeline(requirements, medians):
         entry = medians["handler/one behind the other/iterations:20000/manual_time"]
         return entry["p99_ns"] < 2000, f"median {entry['median_ns']:.0f} ns, 99th percentile {entry['p99_ns']:.0f} ns"
 
+    def intake():
+        entry = medians["intake/every millisecond/iterations:4000/manual_time"]
+        off, on = (entry[f"{state}_p99_ns"] for state in ("off", "on"))
+        return (on <= 1.05 * off, f"median {entry['off_median_ns']:.0f} / {entry['on_median_ns']:.0f} ns, "
+                                  f"99th percentile {off:.0f} / {on:.0f} ns")
+
     def frames(pipeline):
         return medians[f"frames/{pipeline}/iterations:5/manual_time"]["items_per_second"] / 1e6
 
@@ -162,6 +168,7 @@ def check_pipeline(requirements, medians):
         return entry["growth_kb"] <= 64, f"{entry['growth_kb']:.0f} KiB more than after five minutes"
 
     requirements.check("frame handler, all busy: 99th percentile under 2 us", handler)
+    requirements.check("frame intake, not told and told to the record: 99th percentiles within 5 %", intake)
     requirements.check("frames through the pipeline: a million a second",
                        lambda: (frames("quazor") >= 1, f"{frames('quazor'):.2f} million/s"))
     requirements.check("frames through the pipeline: twice as many as on asio strands",

@@ -15,12 +15,21 @@ namespace {
 
 constexpr const char* kUsualStore = "true";  // what CLI11 takes for --store without a file
 
-enum Option { kDays = 1, kStation = 2, kSerial = 4, kDiagnostic = 8, kResult = 16, kRepair = 32, kOperands = 64 };
+enum Option {
+  kDays = 1,
+  kStation = 2,
+  kSerial = 4,
+  kDiagnostic = 8,
+  kResult = 16,
+  kRepair = 32,
+  kOperands = 64,
+  kBy = 128
+};
 constexpr int kOfRuns = kDays | kStation | kSerial;
 constexpr int kOfResults = kOfRuns | kDiagnostic | kResult;
 
 // What each action takes, in the order of the enumerators.
-constexpr int kTaken[] = {kOperands,  kOfRuns,    kOperands,  kOfRuns,           kOfResults, kOfResults,
+constexpr int kTaken[] = {kOperands,  kOfRuns,    kOperands,  kOfRuns | kBy,     kOfResults, kOfResults,
                           kOfResults, kOfResults, kOfResults, kSerial | kRepair, 0};
 
 void require(bool isRight, const std::string& problem) {
@@ -52,7 +61,8 @@ void checkTaken(const RecordsCommandTexts& texts, int taken) {
                  {kDiagnostic, texts.diagnostic.has_value(), "--diagnostic"},
                  {kResult, texts.result.has_value(), "--result"},
                  {kRepair, texts.repaired, "--repaired"},
-                 {kRepair, texts.note.has_value(), "--note"}};
+                 {kRepair, texts.note.has_value(), "--note"},
+                 {kBy, texts.by.has_value(), "--by"}};
   const std::string action = "'quazor records " + texts.action + "'";
   for (const auto& one : options) {
     require(!one.isGiven || (taken & one.option) != 0, std::string(one.name) + " does not apply to " + action);
@@ -70,8 +80,9 @@ CLI::App& declareRecordsCommand(CLI::App& app, RecordsCommandTexts& texts, std::
   command
       .add_option(
           "ACTION", texts.action,
-          "import: take records into the store; list, show: its runs; yield: by station, in the first run of each "
-          "phone; failures: what fails most; flaky: phones with both verdicts; drift: results over the days; "
+          "import: take records into the store; list, show: its runs; yield: by station or another tag, in the first "
+          "run of each phone; failures: what fails most; flaky: phones with both verdicts; drift: results over the "
+          "days; "
           "capability: Cpk and Ppk; gauge: repeatability and reproducibility; mark: that a phone was repaired; "
           "check: whether the store is right")
       ->type_name("")
@@ -92,6 +103,7 @@ CLI::App& declareRecordsCommand(CLI::App& app, RecordsCommandTexts& texts, std::
   add("--result", texts.result, "Only results of this name; a pattern for several", "NAME");
   command.add_flag("--repaired", texts.repaired, "mark: the phone was repaired now, so that it is not flaky");
   add("--note", texts.note, "mark: what was done", "TEXT");
+  add("--by", texts.by, "yield: by the value of this tag, such as lot; default station", "TAG");
   command.add_option("--format", format, "Report format: text, json, csv")
       ->type_name("FORMAT")
       ->check(CLI::IsMember({"text", "json", "csv"}));
@@ -102,7 +114,7 @@ std::vector<std::string*> textsOf(RecordsCommandTexts& texts) {
   std::vector<std::string*> all;
   for (std::string& one : texts.operands) all.push_back(&one);
   for (std::optional<std::string>* one : {&texts.store, &texts.since, &texts.until, &texts.station, &texts.serial,
-                                          &texts.diagnostic, &texts.result, &texts.note}) {
+                                          &texts.diagnostic, &texts.result, &texts.note, &texts.by}) {
     if (*one) all.push_back(&**one);
   }
   return all;
@@ -117,8 +129,8 @@ RecordsRequest recordsRequestOf(const RecordsCommandTexts& texts) {
   requireDay("--until", texts.until);
   require(!texts.since || !texts.until || *texts.since <= *texts.until, "--until is before --since");
   require(!texts.store || !texts.store->empty(), "--store is empty");
-  for (const auto& [name, text] :
-       {std::pair("--diagnostic", &texts.diagnostic), std::pair("--result", &texts.result)}) {
+  for (const auto& [name, text] : {std::pair("--diagnostic", &texts.diagnostic), std::pair("--result", &texts.result),
+                                   std::pair("--by", &texts.by)}) {
     require(!*text || !(*text)->empty(), std::string(name) + " is empty");
   }
   if (request.action == RecordsAction::kImport) {
@@ -139,6 +151,7 @@ RecordsRequest recordsRequestOf(const RecordsCommandTexts& texts) {
           "'quazor records gauge' requires --result: the study is of one result");
   request.store = orUsual(texts.store.value_or(""));
   request.note = texts.note.value_or("");
+  request.by = texts.by.value_or("station");
   request.filter = {texts.since.value_or(""),      texts.until.value_or(""), texts.station, texts.serial,
                     texts.diagnostic.value_or(""), texts.result.value_or("")};
   return request;

@@ -45,6 +45,7 @@ struct RecordsCommandTexts {
   std::optional<std::string> diagnostic;
   std::optional<std::string> result;
   std::optional<std::string> note;
+  std::optional<std::string> by;
   bool repaired = false;
 };
 
@@ -55,6 +56,7 @@ struct RecordsRequest {
   std::vector<std::filesystem::path> records;  // to import
   std::string run;                             // to show
   std::string note;                            // of a repair
+  std::string by;                              // the tag by which a yield is grouped
   Filter filter;
 };
 

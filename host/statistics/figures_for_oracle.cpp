@@ -3,6 +3,7 @@
 #include "host/statistics/control_rules.h"
 #include "host/statistics/gauge.h"
 #include "host/statistics/proportion.h"
+#include "host/statistics/trend.h"
 
 #include <nlohmann/json.hpp>
 
@@ -41,6 +42,11 @@ Json figuresOf(const Json& asked) {
   if (const std::optional<ControlChart> chart = controlChart(days)) {
     for (const BrokenRule& one : brokenRules(chart->distances)) figures["broken"].push_back({one.rule, one.point});
   }
+  std::vector<double> means;
+  for (const Moments& day : days) means.push_back(day.mean());
+  if (const std::optional<Trend> trend = trendOf(means)) figures["trend"] = {trend->tau, trend->chance};
+  if (const std::optional<Trend> trend = trendOf(asked["tied"])) figures["tied"] = {trend->tau, trend->chance};
+  figures["binomial"] = chanceOfAtLeast(asked["hits"], asked["trials"], asked["rate"]);
   std::vector<GaugeReading> readings;
   for (const Json& one : asked["readings"]) readings.push_back({one[0], one[1], one[2]});
   const GaugeResult gauge = gaugeStudy(readings);

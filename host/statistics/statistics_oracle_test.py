@@ -35,7 +35,9 @@ def data_set(chance):
             readings += [[f"P{part}", f"S{place}", mean + of_part[part] + of_place[place] + chance.gauss(0, 1)]
                          for _ in range(times)]
     return {"hits": chance.randrange(trials + 1), "trials": trials, "days": days, "lower": mean - 4 * spread,
-            "upper": mean + chance.uniform(1, 9) * spread, "readings": readings}
+            "upper": mean + chance.uniform(1, 9) * spread, "readings": readings,
+            "tied": [chance.randrange(5) for _ in range(chance.randrange(10, 60))],
+            "rate": chance.choice((0, 1, chance.random(), chance.random() ** 6))}
 
 
 def rules_broken(distances):
@@ -64,6 +66,9 @@ def expected(asked, numpy, scipy, proportion, frames, formula, anova):
     room = min(described.mean - asked["lower"], asked["upper"] - described.mean) / 3
     if not found["broken"] and len(values) >= 25:
         found["cpk"], found["ppk"] = room / within, room / found["deviation"]
+    for key, column in (("trend", [numpy.mean(day) for day in asked["days"]]), ("tied", asked["tied"])):
+        found[key] = list(scipy.kendalltau(range(len(column)), column, method="asymptotic"))
+    found["binomial"] = scipy.binom.sf(asked["hits"] - 1, asked["trials"], asked["rate"])
     frame = frames.DataFrame(asked["readings"], columns=["part", "place", "value"])
     frame["value"] -= frame["value"].mean()  # the libraries' sums lose digits around a large mean
     table = anova(formula("value ~ C(part) * C(place)", frame).fit())

@@ -3,10 +3,13 @@
 #include "host/statistics/gauge.h"
 #include "host/statistics/moments.h"
 #include "host/statistics/proportion.h"
+#include "host/statistics/trend.h"
 
 #include <gmock/gmock.h>
 #include <gtest/gtest.h>
 
+#include <cmath>
+#include <optional>
 #include <string>
 #include <vector>
 
@@ -30,6 +33,41 @@ TEST(WilsonInterval, IsExactAtItsEnds) {
     EXPECT_LT(wilsonInterval(0, trials).high, 1);
     EXPECT_NEAR(wilsonInterval(0, trials).high, 1 - wilsonInterval(trials, trials).low, 1e-12);
   }
+}
+
+TEST(ChanceOfAtLeast, IsTheUpperEndOfABinomialDistribution) {
+  EXPECT_DOUBLE_EQ(chanceOfAtLeast(0, 0, 0.5), 1);
+  EXPECT_DOUBLE_EQ(chanceOfAtLeast(0, 9, 0), 1);
+  EXPECT_DOUBLE_EQ(chanceOfAtLeast(1, 9, 0), 0);
+  EXPECT_DOUBLE_EQ(chanceOfAtLeast(9, 9, 1), 1);
+  EXPECT_NEAR(chanceOfAtLeast(3, 3, 0.5), 0.125, 1e-15);
+  EXPECT_NEAR(chanceOfAtLeast(2, 3, 0.5), 0.5, 1e-15);
+  EXPECT_NEAR(chanceOfAtLeast(1, 1'000'000, 1e-6), 1 - std::exp(-1), 1e-6);
+}
+
+TEST(ChanceLimit, IsSharedByTheFigures) {
+  EXPECT_DOUBLE_EQ(chanceLimit(0), 0.01);
+  EXPECT_DOUBLE_EQ(chanceLimit(40), 0.00025);
+}
+
+TEST(TrendOf, TellsWhichWayAndHowSure) {
+  const std::vector<double> up{1, 2, 3, 4, 5, 6, 7, 8, 9, 10};
+  const std::optional<Trend> rising = trendOf(up);
+  ASSERT_TRUE(rising);
+  EXPECT_DOUBLE_EQ(rising->tau, 1);
+  EXPECT_NEAR(rising->chance, 5.7e-5, 1e-6);  // 45 pairs: 45 / sqrt(10 * 9 * 25 / 18) = 4.02 deviations
+  const std::optional<Trend> falling = trendOf({up.rbegin(), up.rend()});
+  ASSERT_TRUE(falling);
+  EXPECT_DOUBLE_EQ(falling->tau, -1);
+  EXPECT_DOUBLE_EQ(falling->chance, rising->chance);
+  const std::optional<Trend> none = trendOf({1, -1, 1, -1, 1, -1, 1, -1, 1, -1, 1});
+  ASSERT_TRUE(none);
+  EXPECT_NEAR(none->chance, 1, 1e-12);
+}
+
+TEST(TrendOf, NeedsTenValuesThatDiffer) {
+  EXPECT_FALSE(trendOf({1, 2, 3, 4, 5, 6, 7, 8, 9}));
+  EXPECT_FALSE(trendOf(std::vector<double>(20, 3)));
 }
 
 TEST(Moments, AreTheSameInParts) {

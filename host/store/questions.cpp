@@ -83,13 +83,15 @@ class Flips {
   explicit Flips(std::set<std::string> repairs) : repairs_(std::move(repairs)) {}
 
   // `date` is that of the run.
-  void add(const std::string& date, const std::string& verdict) {
+  void add(const std::string& date, const std::string& verdict, const std::string& station) {
     const auto isRepaired = [&](const std::string& repair) { return last_ < repair && repair <= date; };
     if (!last_.empty() && std::any_of(repairs_.begin(), repairs_.end(), isRepaired)) take();
     if (first_.empty()) first_ = date;
     last_ = date;
     passed_ += verdict == "pass" ? 1 : 0;
-    failed_ += verdict == "fail" ? 1 : 0;
+    if (verdict != "fail") return;
+    ++failed_;
+    stations_.insert(station);
   }
 
   // The last stretch between two repairs that had both verdicts.
@@ -100,8 +102,11 @@ class Flips {
 
  private:
   void take() {
-    if (passed_ > 0 && failed_ > 0) found_ = FlakyPhone{{}, {}, passed_, failed_, first_, last_};
+    if (passed_ > 0 && failed_ > 0) {
+      found_ = FlakyPhone{{}, {}, passed_, failed_, {stations_.begin(), stations_.end()}, first_, last_};
+    }
     passed_ = failed_ = 0;
+    stations_.clear();
     first_.clear();
   }
 
@@ -110,6 +115,7 @@ class Flips {
   std::string last_;
   std::uint64_t passed_ = 0;
   std::uint64_t failed_ = 0;
+  std::set<std::string> stations_;
   std::optional<FlakyPhone> found_;
 };
 
@@ -153,12 +159,20 @@ RunDetails runNamed(Database& store, const std::string& name) {
   return details;
 }
 
-Yields yieldOf(Database& store, const Filter& filter) {
+Yields yieldOf(Database& store, const Filter& filter, const std::string& tag) {
+  const bool isByStation = tag == "station";
+  // The station stands in the run's row.
+  const std::string group =
+      isByStation ? "station" : "ifnull((SELECT value FROM tag WHERE tag.run = run.id AND tag.key = ?), '')";
+  const auto bound = [&](Statement& statement) -> Statement& {
+    if (!isByStation) statement.bind(tag);
+    return bindRuns(statement, filter);
+  };
   Yields yields;
   std::map<std::string, Yield> stations;
-  Statement runs(store, "SELECT counted, station, count(*), sum(serial = '') FROM run WHERE " + kOfRuns +
-                            " GROUP BY counted, station");
-  bindRuns(runs, filter);
+  Statement runs(
+      store, "SELECT counted, " + group + ", count(*), sum(serial = '') FROM run WHERE " + kOfRuns + " GROUP BY 1, 2");
+  bound(runs);
   while (runs.step()) {
     const bool isCounted = runs.integer() != 0;
     const std::string station = runs.text();
@@ -176,17 +190,18 @@ Yields yieldOf(Database& store, const Filter& filter) {
   // With min(), the other columns are those of the row that has it.
   const auto firsts = [&](const std::string& by, const auto& take) {
     Statement rows(store,
-                   "SELECT station, verdict, count(*) FROM (SELECT station, verdict, day, serial, min(date) FROM "
-                   "run WHERE counted AND serial <> '' GROUP BY " +
-                       by + ") WHERE " + kOfRuns + " GROUP BY station, verdict");
-    bindRuns(rows, filter);
+                   "SELECT place, verdict, count(*) FROM (SELECT " + group +
+                       " AS place, station, verdict, day, serial, min(date) FROM run WHERE counted AND serial <> '' "
+                       "GROUP BY " +
+                       by + ") WHERE " + kOfRuns + " GROUP BY place, verdict");
+    bound(rows);
     while (rows.step()) {
       const std::string station = rows.text();
       const std::string verdict = rows.text();
       take(station, verdict, static_cast<std::uint64_t>(rows.integer()));
     }
   };
-  firsts("serial, station", [&](const std::string& station, const std::string& verdict, std::uint64_t number) {
+  firsts("serial, place", [&](const std::string& station, const std::string& verdict, std::uint64_t number) {
     count(stations[station], verdict, number);
     if (filter.station) count(yields.all, verdict, number);
   });
@@ -227,7 +242,7 @@ std::vector<FlakyPhone> flakyPhones(Database& store, const Filter& filter) {
                    "WHERE result.verdict = 'fail' AND result.characteristic = ? AND serial <> '' AND " +
                        kOfRuns);
   Statement results(store,
-                    "SELECT date, result.verdict FROM run CROSS JOIN result ON result.characteristic = ? AND "
+                    "SELECT date, result.verdict, station FROM run CROSS JOIN result ON result.characteristic = ? AND "
                     "result.run = run.id WHERE serial = ? AND serial <> '' AND " +
                         std::string(kOfDayAndStation) + " ORDER BY date, result.number");
   Statement repairs(store, "SELECT date FROM repair WHERE serial = ?");
@@ -240,7 +255,8 @@ std::vector<FlakyPhone> flakyPhones(Database& store, const Filter& filter) {
       bindDayAndStation(results.bind(one.id).bind(serial), filter);
       while (results.step()) {
         const std::string date = results.text();
-        flips.add(date, results.text());
+        const std::string verdict = results.text();
+        flips.add(date, verdict, results.text());
       }
       results.reset();
       std::optional<FlakyPhone> phone = flips.found();

@@ -48,7 +48,7 @@ RunDetails runNamed(Database& store, const std::string& name);
 // number, at that station; of all stations together it is the first anywhere. A question about some days counts the
 // phones whose first run was on one of them.
 struct Yield {
-  std::string station;
+  std::string station;       // or the value of the tag by which the runs are grouped
   std::uint64_t passed = 0;  // phones, in their first run
   std::uint64_t failed = 0;
   std::uint64_t neither = 0;  // an error, or skipped
@@ -62,7 +62,8 @@ struct Yields {
   std::uint64_t uncounted = 0;  // runs that came to no end, of experiments, or analyses
 };
 
-Yields yieldOf(Database& store, const Filter& filter);
+// By station, or by the value of another tag: a phone's first run is then the first with that value.
+Yields yieldOf(Database& store, const Filter& filter, const std::string& tag = "station");
 
 // A diagnostic that ended in the same error.
 struct ErrorCount {
@@ -82,7 +83,8 @@ struct FlakyPhone {
   Characteristic of;
   std::uint64_t passed = 0;
   std::uint64_t failed = 0;
-  std::string first;  // the date of the first result between two repairs
+  std::vector<std::string> stations;  // where it failed, in their order
+  std::string first;                  // the date of the first result between two repairs
   std::string last;
 };
 

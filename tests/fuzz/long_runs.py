@@ -4,8 +4,9 @@
 usage: tests/fuzz/long [--seconds SECONDS] [--slice SECONDS] [--state FOLDER] BUILD_DIRECTORY [FUZZER...]
 
 One fuzzer runs at a time, at low priority, the one with the fewest seconds first, until each has run for SECONDS (default
-3600). Seconds are those of processor time, because a busy machine gives a fuzzer little of each second on the clock. It can be interrupted at any time: the next call goes on with the corpus and the sums in FOLDER (default
-$XDG_STATE_HOME/quazor/fuzz). An input that fails stays in FOLDER/FUZZER/failing; the next call tries it again first and,
+3600). Seconds are those of processor time, because a busy machine gives a fuzzer little of each second on the clock; nor is an
+input too slow that only waited for the processor. It can be interrupted at any time: the next call goes on with the corpus and
+the sums in FOLDER (default $XDG_STATE_HOME/quazor/fuzz). An input that fails stays in FOLDER/FUZZER/failing; the next call tries it again first and,
 if it passes by then, moves it to the corpus. Prints a table at the end.
 
 Exit code 0: each fuzzer has run for SECONDS; 1: an input fails, which is named; 2: interrupted.
@@ -26,7 +27,10 @@ import sys
 
 ROOT = pathlib.Path(__file__).resolve().parents[2]
 HEARTBEAT = 5.0  # seconds between two saves of the sums
-LIMITS = ("-max_len=65536", "-timeout=10", "-rss_limit_mb=4096")
+LIMITS = ("-max_len=65536", "-rss_limit_mb=4096")
+LONGEST_UNIT = 10  # seconds of processor time
+STARVED = 60  # so many times as long may it take on the clock of a busy machine
+TOO_SLOW = ("timeout-", "slow-unit-")
 PROGRESS = re.compile(r"\bcov: (\d+)")
 EXECUTIONS = re.compile(r"stat::number_of_executed_units: *(\d+)")
 
@@ -89,11 +93,23 @@ def write_seeds(programs, state):
     return seeds, sorted(path.name for path in seeds.iterdir())
 
 
-def retry_failing(programs, state, fuzzer):
-    """The first kept input that still fails, or None; moves the others to the corpus."""
+def fails(programs, fuzzer, kept):
+    """Whether an input fails if it is tried alone."""
+    def limit():
+        resource.setrlimit(resource.RLIMIT_CPU, (LONGEST_UNIT, LONGEST_UNIT))
+    command = [programs / f"{fuzzer}_fuzzer", *LIMITS, "-timeout=0", kept]
+    try:
+        return subprocess.run(command, capture_output=True, check=False, preexec_fn=limit,
+                              timeout=LONGEST_UNIT * STARVED).returncode != 0
+    except subprocess.TimeoutExpired:
+        return True
+
+
+def retry_failing(programs, state, fuzzer, kinds=("",)):
+    """The first kept input that still fails, or None; moves the others to the corpus. `kinds` are beginnings of names:
+    an input of another kind is taken for one that fails."""
     for kept in state.failing(fuzzer):
-        done = subprocess.run(command_of(programs, fuzzer, *LIMITS, kept), capture_output=True, check=False)
-        if done.returncode != 0:
+        if not kept.name.startswith(kinds) or fails(programs, fuzzer, kept):
             return kept
         kept.replace(state.part(fuzzer, "corpus") / kept.name)
     return None
@@ -121,7 +137,7 @@ def run_slice(programs, state, seeds, fuzzer, seconds):
     """Runs a fuzzer and adds to its sums, even if interrupted. Returns its exit code."""
     sums = state.of(fuzzer)
     logfile = state.folder / fuzzer / "log"
-    arguments = [f"-max_total_time={seconds}", "-print_final_stats=1", *LIMITS,
+    arguments = [f"-max_total_time={seconds}", "-print_final_stats=1", f"-timeout={LONGEST_UNIT * STARVED}", *LIMITS,
                  f"-artifact_prefix={state.part(fuzzer, 'failing')}/", state.part(fuzzer, "corpus"), seeds / fuzzer]
     before, ended_before = sums["seconds"], processor_seconds_of_ended_processes()
 
@@ -176,9 +192,12 @@ def fuzz(programs, state, fuzzers, seeds, goal, longest):
         if left <= 0:
             return 0
         code = run_slice(programs, state, seeds, fuzzer, max(1, round(min(left, longest))))
-        failing = state.failing(fuzzer)
-        if code != 0 or failing:
-            report_failure(state, fuzzer, failing[0] if failing else f"exit code {code} and no input")
+        if code != 0 and not state.failing(fuzzer):
+            report_failure(state, fuzzer, f"exit code {code} and no input")
+            return 1
+        kept = retry_failing(programs, state, fuzzer, TOO_SLOW)
+        if kept is not None:
+            report_failure(state, fuzzer, kept)
             return 1
 
 

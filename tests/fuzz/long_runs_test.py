@@ -9,6 +9,9 @@ import sys
 import tempfile
 import time
 import unittest
+from unittest import mock
+
+import long_runs
 
 PROGRAM = pathlib.Path(__file__).resolve().parent / "long_runs.py"
 SEEDS = 'mkdir -p "$2/quick" "$2/slow" && echo seed >"$2/quick/one" && echo seed >"$2/slow/one"\n'
@@ -116,6 +119,26 @@ class LongRunsTest(unittest.TestCase):
         self.assertEqual(mended.returncode, 0, mended.stdout)
         self.assertFalse(kept.exists())
         self.assertTrue((self.state / "quick" / "corpus" / "crash-1").exists())
+
+    def test_an_input_that_only_waited_for_the_processor_is_not_too_slow(self):
+        slow = 'if [ ! -e MENDED ]; then echo good >"${failing}timeout-1"; touch MENDED; exit 70; fi\n'
+        self.write("quick_fuzzer", FUZZER + slow + WORK + "finish\n")
+        done = self.run_long("--seconds", "0.05", fuzzers=["quick"])
+        self.assertEqual(done.returncode, 0, done.stdout)
+        self.assertTrue((self.state / "quick" / "corpus" / "timeout-1").exists())
+
+    def test_an_input_that_crashed_once_is_reported(self):
+        self.write("quick_fuzzer", FUZZER + 'echo good >"${failing}crash-1"\nexit 77\n')
+        done = self.run_long("--seconds", "0.05", fuzzers=["quick"])
+        self.assertEqual(done.returncode, 1)
+        self.assertIn("crash-1", done.stdout)
+
+    def test_an_input_that_needs_the_processor_for_long_is_too_slow(self):
+        self.write("quick_fuzzer", "while :; do :; done\n")
+        self.write("slow_fuzzer", "sleep 2\n")
+        with mock.patch.object(long_runs, "LONGEST_UNIT", 1):
+            self.assertTrue(long_runs.fails(self.build / "fuzz", "quick", "input"))
+            self.assertFalse(long_runs.fails(self.build / "fuzz", "slow", "input"))
 
     def test_a_fuzzer_that_ends_in_another_way_fails_too(self):
         self.write("quick_fuzzer", "exit 5\n")

@@ -10,6 +10,7 @@ from arrived import expect, expect_equal, underlying
 from kernel_trace import gaps_in, read_trace
 
 RATE, SECONDS = 30, 2
+SECONDS_OF_PROJECTOR = 3  # after which a run of the projector's diagnostic stops
 BUSES = [f"usb-vhci_hcd.0-{number}" for number in range(1, 6)]  # of the cameras, in the order in which they are connected
 NAMES = {  # of measurements, by port
     "BackFacingCamera": "BackWide",
@@ -241,6 +242,20 @@ def usb_unplugged(step):
     for moment in ("commit", "start", "streaming", "stop"):
         expect_unplugged(step, f"{moment}_camera")
     healthy_again(step)
+
+
+def usb_projector_unplugged(step):
+    for moment in ("0", "10", "29", "at_stop"):
+        step.ended_in_error(f"judged_{moment}", cameras.CAPTURE, 205, "Failed to stop stream!")
+    for moment in ("at_commit", "at_start"):
+        below = underlying(step.ended_in_error(f"judged_{moment}", cameras.CAPTURE, 204))
+        expect_equal(f"the cause ({moment})", (below["domain"], below["code"]), (cameras.LINUX, cameras.SYSTEM_CALL))
+    for moment in ("0", "10", "29", "at_commit", "at_start", "at_stop"):
+        expect_run_of(step, f"judged_{moment}", SECONDS_OF_PROJECTOR + ANSWER)
+        expect_unplugged(step, f"camera_{moment}")
+    step.passed("next")
+    expect_equal("the light after the next run", step.number("dark_after"), 0)
+    activity(step, "next_camera")
 
 
 def usb_unplugged_anytime(step):

@@ -69,6 +69,8 @@ STEPS = [
     Step("usb_late_frames", "late frames, and none, are noticed", usb.usb_late_frames, boot=3),
     Step("usb_unplugged", "a USB camera is unplugged before, at the start, in and after a stream", usb.usb_unplugged,
          boot=3),
+    Step("usb_projector_unplugged", "a USB camera with a projector is unplugged before, in and after a stream",
+         usb.usb_projector_unplugged, boot=4),
     Step("usb_unplugged_anytime", "a USB camera is unplugged at ten moments of a stream", usb.usb_unplugged_anytime,
          boot=3, limit=120, thorough=True),
     Step("usb_60s", "two USB cameras for 60 s, without loss, as the kernel counts them", usb.usb_60s, boot=3, limit=120, soak=True, thorough=True),

@@ -38,6 +38,28 @@ class YieldTest(StoreTest):
         self.assertEqual([(row["station"], row["passed"], row["failed"]) for row in since], [("S2", 1, 1)])
         self.assertEqual(self.rows("yield", "--station", "S1"), [rows["S1"]])
 
+    def test_by_another_tag(self):
+        for serial, lot, verdict in (("A", "1", good()), ("A", "1", BAD), ("A", "2", BAD), ("B", "2", good()), ("C", "", BAD)):
+            tags = [["serial", serial], ["station", "S1"]] + ([["lot", lot]] if lot else [])
+            self.make(verdict, tags=tags)
+        self.imported(imported=5)
+        rows = {row["group"]: (row["passed"], row["failed"], row["runs"]) for row in self.rows("yield", "--by", "lot")}
+        # A phone counts once in each lot, and once in all.
+        self.assertEqual(rows, {"": (0, 1, 1), "1": (1, 0, 2), "2": (1, 1, 2), "(all)": (2, 1, 5)})
+
+    def test_a_yield_that_chance_does_not_explain(self):
+        for number in range(40):
+            self.make(BAD if number % 4 == 0 else good(), serial=f"A{number}", station="S1")
+            self.make(good(), serial=f"B{number}", station="S2")
+            self.make(good(), serial=f"C{number}", station="S3")
+        self.imported(imported=120)
+        rows = {row["station"]: row["chance"] for row in self.rows("yield")}
+        # 10 or more of 40 if 10 of 120 fail: 0.00132 (scipy), below 0.01 / 3.
+        self.assertAlmostEqual(rows["S1"], 0.0013236, 6)
+        self.assertEqual((rows["S2"], rows["S3"], rows["(all)"]), (1, 1, None))
+        self.assertIn("Lower than chance explains: S1. Chance is", self.records("yield").stdout)
+        self.assertNotIn("explain", self.records("yield", "--station", "S1").stdout)
+
     def test_nothing_judged_has_no_yield(self):
         self.make([], error=True, serial="A")
         self.imported(imported=1)
@@ -84,6 +106,12 @@ class FlakyTest(StoreTest):
         self.assertEqual(self.found(), [("F", 1, 1), ("A", 2, 1)])
         self.assertEqual(self.found("--since", day(2)), [])
         self.assertEqual(self.found("--serial", "A"), [("A", 2, 1)])
+
+    def test_where_a_phone_failed(self):
+        for verdict, station in ((good(), "S1"), (BAD, "S3"), (BAD, "S2"), (good(), "S2"), (BAD, "S3")):
+            self.make(verdict, serial="A", station=station)
+        self.imported(imported=5)
+        self.assertEqual([row["failed_at"] for row in self.rows("flaky")], ["S2, S3"])
 
     def test_a_repair_between(self):
         self.make(BAD, serial="A")

@@ -44,7 +44,7 @@ Answer answerTo(const RecordsRequest& request, Database& store) {
   switch (request.action) {
     case RecordsAction::kList: return listAnswer(store, request.filter);
     case RecordsAction::kShow: return showAnswer(store, request.run);
-    case RecordsAction::kYield: return yieldAnswer(store, request.filter);
+    case RecordsAction::kYield: return yieldAnswer(store, request.filter, request.by);
     case RecordsAction::kFailures: return failuresAnswer(store, request.filter);
     case RecordsAction::kFlaky: return flakyAnswer(store, request.filter);
     case RecordsAction::kDrift: return driftAnswer(store, request.filter);

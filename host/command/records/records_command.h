@@ -33,7 +33,7 @@ std::string importAfterRun(const std::filesystem::path& store, const std::filesy
 ExitCode importRecords(const RecordsRequest& request, Answer& answer, Console& console, WatchedSignals* signals);
 Answer listAnswer(Database& store, const Filter& filter);
 Answer showAnswer(Database& store, const std::string& run);
-Answer yieldAnswer(Database& store, const Filter& filter);
+Answer yieldAnswer(Database& store, const Filter& filter, const std::string& tag);
 Answer failuresAnswer(Database& store, const Filter& filter);
 Answer flakyAnswer(Database& store, const Filter& filter);
 Answer driftAnswer(Database& store, const Filter& filter);

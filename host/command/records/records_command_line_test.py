@@ -216,6 +216,8 @@ class UsageTest(StoreTest):
                                 (["list", "--since", "Monday"], "--since 'Monday' is no day, such as 2026-11-21"),
                                 (["list", "--since", "2026-02-30"], "is no day"),
                                 (["list", "--since", day(1), "--until", day(0)], "--until is before --since"),
+                                (["flaky", "--by", "lot"], "--by does not apply to 'quazor records flaky'"),
+                                (["yield", "--by", ""], "--by is empty"),
                                 (["flaky", "--result", ""], "--result is empty")):
             with self.subTest(arguments):
                 self.assert_refused(quazor("records", *arguments), 64, text)

@@ -5,6 +5,7 @@
 #include "host/statistics/control_rules.h"
 #include "host/statistics/gauge.h"
 #include "host/statistics/proportion.h"
+#include "host/statistics/trend.h"
 #include "host/store/questions.h"
 #include "host/store/summaries.h"
 #include "host/text/table.h"
@@ -30,6 +31,7 @@ struct Series {
   std::vector<DaySummary> days{};
   std::vector<BrokenRule> broken{};
   std::optional<ControlChart> chart{};
+  std::optional<Trend> trend{};
 };
 
 std::vector<Series> seriesOf(Database& store, const std::vector<StoredCharacteristic>& all, const Filter& filter) {
@@ -44,7 +46,12 @@ std::vector<Series> seriesOf(Database& store, const std::vector<StoredCharacteri
       std::vector<Moments> values;
       for (const DaySummary& day : found.days) values.push_back(day.summary.values);
       found.chart = controlChart(values);
-      if (found.chart) found.broken = brokenRules(found.chart->distances);
+      if (found.chart) {
+        found.broken = brokenRules(found.chart->distances);
+        std::vector<double> means;
+        for (const Moments& day : values) means.push_back(day.mean());
+        found.trend = trendOf(means);
+      }
       series.push_back(std::move(found));
     }
   }
@@ -137,21 +144,31 @@ Answer driftAnswer(Database& store, const Filter& filter) {
   }
   const std::size_t found = series.size();
   std::erase_if(series, [](const Series& one) { return !one.chart; });
-  std::stable_sort(series.begin(), series.end(),
-                   [](const Series& a, const Series& b) { return a.broken.size() > b.broken.size(); });
+  // Of many charts, some have a trend by chance.
+  const double limit = chanceLimit(series.size());
+  const auto drifts = [limit](const Series& one) { return one.trend && one.trend->chance < limit; };
+  std::stable_sort(series.begin(), series.end(), [&](const Series& a, const Series& b) {
+    return std::pair(drifts(a), a.broken.size()) > std::pair(drifts(b), b.broken.size());
+  });
   AnswerTable table{"drift",
-                    {"signals", "diagnostic", "result", "limit", "station", "days", "mean", "first_day", "last_day"}};
+                    {"drifts", "chance", "signals", "diagnostic", "result", "limit", "station", "days", "mean",
+                     "first_day", "last_day"}};
   for (const Series& one : series) {
-    table.rows.push_back({signalsOf(one), one.of->of.diagnostic, one.of->of.name, limitText(one.of->of), one.station,
+    const std::string direction = !drifts(one) ? "" : one.trend->tau > 0 ? "up" : "down";
+    table.rows.push_back({direction, one.trend ? AnswerCell(one.trend->chance) : AnswerCell(), signalsOf(one),
+                          one.of->of.diagnostic, one.of->of.name, limitText(one.of->of), one.station,
                           countCell(one.days.size()), one.chart->centre, one.days.front().summary.values.mean(),
                           one.days.back().summary.values.mean()});
   }
   answer.tables.push_back(std::move(table));
   const auto broken =
       std::count_if(series.begin(), series.end(), [](const Series& one) { return !one.broken.empty(); });
-  answer.after.push_back(series.empty()
-                             ? "No result of the store has values of several days."
-                             : formatMessage("%@ of %@ charts break a rule of control charts.", broken, series.size()));
+  answer.after.push_back(
+      series.empty()
+          ? "No result of the store has values of several days."
+          : formatMessage("%@ of %@ charts drift: their days go up or down by more than chance explains. %@ break a "
+                          "rule of control charts.",
+                          std::count_if(series.begin(), series.end(), drifts), series.size(), broken));
   if (broken > 0) answer.after.emplace_back("--result, --diagnostic and --station show the days of one of them.");
   if (found > series.size()) {
     answer.after.push_back(countText(found - series.size(), "result") +

@@ -1,4 +1,5 @@
 // list, show, yield and flaky.
+#include "base/text/name_list.h"
 #include "contract/message_format.h"
 #include "host/command/records/records_command.h"
 #include "host/statistics/proportion.h"
@@ -11,7 +12,7 @@ namespace {
 
 std::string outcomeOf(const RunLine& run) { return run.whole ? run.verdict : "not whole"; }
 
-std::vector<AnswerCell> yieldRow(const Yield& yield, const std::string& station) {
+std::vector<AnswerCell> yieldRow(const Yield& yield, const std::string& station, AnswerCell chance) {
   const std::uint64_t judged = yield.passed + yield.failed;
   const Interval interval = wilsonInterval(yield.passed, judged);
   const auto ofJudged = [judged](double rate) { return judged == 0 ? AnswerCell() : AnswerCell(rate); };
@@ -23,6 +24,7 @@ std::vector<AnswerCell> yieldRow(const Yield& yield, const std::string& station)
           ofJudged(rate),
           ofJudged(interval.low),
           ofJudged(interval.high),
+          std::move(chance),
           countCell(yield.runs),
           countCell(yield.unnamed)};
 }
@@ -67,17 +69,36 @@ Answer showAnswer(Database& store, const std::string& name) {
   return {{}, {std::move(facts), std::move(entries), std::move(results)}, {}};
 }
 
-Answer yieldAnswer(Database& store, const Filter& filter) {
-  const Yields yields = yieldOf(store, filter);
+Answer yieldAnswer(Database& store, const Filter& filter, const std::string& tag) {
+  const Yields yields = yieldOf(store, filter, tag);
+  const bool isByStation = tag == "station";
   AnswerTable table{"yield",
-                    {"station", "passed", "failed", "neither", "first_pass_yield", "low", "high", "runs", "no_serial"}};
-  for (const Yield& one : yields.stations) table.rows.push_back(yieldRow(one, one.station));
-  if (yields.stations.size() != 1) table.rows.push_back(yieldRow(yields.all, "(all)"));
+                    {isByStation ? "station" : "group", "passed", "failed", "neither", "first_pass_yield", "low",
+                     "high", "chance", "runs", "no_serial"}};
+  std::uint64_t passed = 0;
+  std::uint64_t failed = 0;
+  for (const Yield& one : yields.stations) {
+    passed += one.passed;
+    failed += one.failed;
+  }
+  const std::uint64_t judged = passed + failed;
+  const double rate = judged == 0 ? 0 : static_cast<double>(failed) / static_cast<double>(judged);
+  std::vector<std::string> low;
+  for (const Yield& one : yields.stations) {
+    const double chance = chanceOfAtLeast(one.failed, one.passed + one.failed, rate);
+    if (chance < chanceLimit(yields.stations.size())) low.push_back(one.station.empty() ? "(none)" : one.station);
+    table.rows.push_back(yieldRow(one, one.station, chance));
+  }
+  if (yields.stations.size() != 1) table.rows.push_back(yieldRow(yields.all, "(all)", {}));
   Answer answer{{}, {std::move(table)}, {}};
   answer.after.emplace_back(
       "Passed, failed and neither (an error, or skipped) are phones in their first run; low and high are the 95 % "
-      "interval "
-      "of the yield.");
+      "interval of the yield.");
+  if (yields.stations.size() > 1) {
+    answer.after.push_back((low.empty() ? "No yield is lower than chance explains."
+                                        : "Lower than chance explains: " + listText(low) + ".") +
+                           " Chance is how probable so many failures are if all are alike.");
+  }
   if (yields.all.unnamed > 0) {
     answer.after.push_back(countText(yields.all.unnamed, "run") +
                            " without the tag serial=NUMBER: no yield counts what nobody can tell apart.");
@@ -90,10 +111,11 @@ Answer yieldAnswer(Database& store, const Filter& filter) {
 }
 
 Answer flakyAnswer(Database& store, const Filter& filter) {
-  AnswerTable table{"flaky", {"serial", "diagnostic", "result", "limit", "passed", "failed", "first", "last"}};
+  AnswerTable table{"flaky",
+                    {"serial", "diagnostic", "result", "limit", "passed", "failed", "failed_at", "first", "last"}};
   for (const FlakyPhone& one : flakyPhones(store, filter)) {
     table.rows.push_back({one.serial, one.of.diagnostic, one.of.name, limitText(one.of), countCell(one.passed),
-                          countCell(one.failed), one.first, one.last});
+                          countCell(one.failed), listText(one.stations), one.first, one.last});
   }
   Answer answer{{}, {}, {}};
   if (table.rows.empty()) {

@@ -5,12 +5,9 @@ judge_camera single
 disconnect_cameras camera
 binding=/rig/usb_projector.json
 make_channels
-fault() {
-  judge "$1" TesselFaultDiagnostic --set experiment.frameCount=30 --set timeout=5 --set analysis.frameCount=30
-}
 connect_cameras exposure_camera 2 --stall exposure-mode:GET_DEF
-fault exposure
+judge_projector exposure 30 5
 disconnect_cameras exposure_camera
 connect_cameras set_camera 2 --stall exposure-mode:SET_CUR
-fault set
+judge_projector set 30 5
 disconnect_cameras set_camera
