@@ -1,6 +1,7 @@
 """User-defined limits on the command line, in profiles and in records."""
 
 import json
+import pathlib
 import unittest
 
 from command_line_fixture import PLUGINS, CommandLineTest, WORKING, events_in, quazor
@@ -80,6 +81,13 @@ class LimitsTest(CommandLineTest):
         del limit["severity"]
         profile = self.profile({"Fake.*": {"limits": [limit]}})
         self.assertEqual(self.results_of("--parameters", profile)[:2], (1, "fail"))
+
+    def test_the_profile_of_the_document_can_be_given_in_both_ways(self):
+        document = (pathlib.Path(__file__).resolve().parents[2] / "docs" / "user_limits.md").read_text()
+        file = self.write("mine.json", document.split("```json\n")[1].split("```")[0])
+        for option in ("--profile", "--parameters"):
+            done = quazor("run", "--all", option, file)
+            self.assertEqual((done.returncode, done.stderr), (0, ""), done.stdout)
 
     def test_a_limit_of_a_profile_counts_only_for_selected_diagnostics(self):
         profile = json.loads(self.profile({}).read_text())

@@ -246,14 +246,43 @@ class PluginReview {
 
   void readBesideExplanations() {
     std::vector<fs::path> folders = foldersBeside("explanations");
+    const std::vector<fs::path> beside = folders;
     for (const fs::path& installed : installation_.explanations()) folders.push_back(installed);
     try {
       readExplanations(folders);
+      if (!beside.empty()) {
+        for (const Explanation& one : readExplanations(beside)) reviewExplanation(one);
+      }
       addExplainedRanges(folders, scan_.catalogue);
     } catch (const InputError& problem) {
       tell(Rating::kProblem, "explanations", problem.what());
     }
     isExplained_ = explainedTopics(std::move(folders));
+  }
+
+  // Finds what is left of the template, or of an earlier name.
+  void reviewExplanation(const Explanation& one) {
+    std::vector<std::string> about = one.from;
+    if (one.kind != "result") about.insert(about.end(), one.names.begin(), one.names.end());
+    for (const ExplainedMessage& message : one.messages)
+      about.insert(about.end(), message.from.begin(), message.from.end());
+    std::erase_if(about, [this](const std::string& name) {
+      return std::ranges::any_of(scan_.catalogue, [&name](const DescribedDiagnostic& known) {
+        const Diagnostic& diagnostic = known.diagnostic;
+        return name == diagnostic.name || name == diagnostic.experimentName || name == diagnostic.analysisName;
+      });
+    });
+    const std::string topic = one.isError() ? keyOf(one.domain, one.code) : one.names.front();
+    if (!about.empty()) {
+      tell(Rating::kAdvice, "explanations",
+           formatMessage("that of %@ is about %@, which the plug-in does not have; correct the name, or remove what is "
+                         "left of an earlier one",
+                         topic, listText(about)));
+    }
+    for (const std::string& text : {one.title, one.meaning}) {
+      if (text.find("TODO") == std::string::npos && text.find("FIXME") == std::string::npos) continue;
+      tell(Rating::kAdvice, "explanations", formatMessage("that of %@ is not written yet: '%@'", topic, text));
+    }
   }
 
   void reviewRanges() {

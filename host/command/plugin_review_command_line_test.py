@@ -135,6 +135,14 @@ class ExampleTest(ReviewCase):
         self.assertEqual([text for text in self.texts("advice", findings) if not text.startswith("run path: ")], [])
         self.assert_said("ok", "^EventCountDiagnostic: passes on the healthy phone", findings)
         self.assert_said("ok", "^phones: 1 diagnostic with a phone that must pass", findings)
+        left = project / "explanations/event_count.json"
+        left.write_text(left.read_text().replace('"EventCountDiagnostic"', '"CountDiagnostic"')
+                        .replace("Changes of the display's brightness", "TODO: say what it is"))
+        findings = self.review(plugin)
+        for text in ("that of CountDiagnostic is about CountDiagnostic, which the plug-in does not have; correct the name",
+                     "that of EventCount.Total is about CountDiagnostic, which the plug-in does not have",
+                     "that of CountDiagnostic is not written yet: 'TODO: say what it is'"):
+            self.assert_said("advice", f"^explanations: {text}", findings)
         (project / "phones/few_events.json").write_text("{")
         (project / "explanations/event_count.json").write_text("{}")
         problems = self.texts("problem", self.review(plugin))

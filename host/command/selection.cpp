@@ -4,6 +4,7 @@
 #include "contract/message_format.h"
 #include "host/command/explanations.h"
 #include "host/command/unknown_name.h"
+#include "host/error/nesting.h"
 #include "host/model/limit_check.h"
 #include "host/plugin/plugin_loader.h"
 #include "host/plugin/plugin_trust.h"
@@ -270,8 +271,7 @@ void tellWhatFailedOnesHide(const std::vector<HiddenPlugin>& hidden, std::vector
     for (const HiddenPlugin& other : hidden) {
       if (other.by != one.file) continue;
       const std::string hint = formatMessage("; it hides '%@', which has the same file name", other.file.string());
-      one.error = errorWithMessage(one.error->domain(), one.error->code(), one.error->localizedDescription() + hint,
-                                   one.error->underlyingError());
+      one.error = errorWithMore(*one.error, hint);
     }
   }
 }

@@ -55,4 +55,8 @@ DiagnosticErrorPtr errorWithinLevels(DiagnosticErrorPtr error) {
   return rebuilt;
 }
 
+DiagnosticErrorPtr errorWithMore(const DiagnosticError& same, const std::string& more) {
+  return errorWithMessage(same.domain(), same.code(), same.localizedDescription() + more, same.underlyingError());
+}
+
 }  // namespace quazor

@@ -19,4 +19,7 @@ DiagnosticErrorPtr errorOfDeepEntry(const std::string& key, const std::string& e
 DiagnosticErrorPtr errorWithinLevels(DiagnosticErrorPtr error);
 inline constexpr int kMaxCausesKept = 100;
 
+// The error with more at the end of its text.
+DiagnosticErrorPtr errorWithMore(const DiagnosticError& same, const std::string& more);
+
 }  // namespace quazor
