@@ -37,7 +37,7 @@ RUNS = (
     ["run", "CameraSyncDiagnostic.Back", "--realtime", "--set", "duration=2", "--heartbeat", "1"],
     ["experiment", "--all"],
     ["run", "CameraSyncDiagnostic.*", *MANY, "--skip", "CameraSyncDiagnostic.Front=x"],
-    ["run", "TesselFaultDiagnostic", "--repeat", "4", "--phone", "camera_sync/frames_dropped"],
+    ["run", "TesselFaultDiagnostic", "--repeat", "4", "--trace", "queues", "--phone", "camera_sync/frames_dropped"],
     ["experiment", "CameraSyncExperiment.*", *MANY],
     ["run", "--all", "--skip", "Tessel*=they are not needed"],
     ["experiment", "NimbeImageExperiment", "--plugin", SENSOR_IMAGES],

@@ -94,8 +94,10 @@ std::vector<SimulatedPhone::HeldBuffer> SimulatedPhone::buffersHeld() const {
   return held;
 }
 
-void SimulatedPhone::traceFrames(FrameTrace& trace) {
-  hardware_->traceFrames(trace, scheduler_ == nullptr ? WhenTraceIsFull::kLose : WhenTraceIsFull::kWait);
+void SimulatedPhone::traceFrames(FrameTrace& trace) { hardware_->traceFrames(trace, whenTraceIsFull()); }
+
+WhenTraceIsFull SimulatedPhone::whenTraceIsFull() const {
+  return scheduler_ == nullptr ? WhenTraceIsFull::kLose : WhenTraceIsFull::kWait;
 }
 
 std::uint64_t SimulatedPhone::deliverFrames(std::string_view camera, std::uint64_t count) {

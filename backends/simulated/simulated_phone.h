@@ -68,6 +68,8 @@ class SimulatedPhone final {
   std::uint64_t framesDelivered() const { return hardware_->pool->taken(); }
   // Tells the trace each frame that is delivered from now on; in virtual time it waits for room. No stream may run.
   void traceFrames(FrameTrace& trace);
+  // In virtual time what is traced waits for room.
+  WhenTraceIsFull whenTraceIsFull() const;
   // The number of releases of a pixel buffer without a matching reference.
   std::uint64_t strayReleases() const { return hardware_->pool->strayReleases(); }
   // Passes the next `count` frames of the camera's running stream to its handler immediately, on this thread. These

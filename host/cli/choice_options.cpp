@@ -90,8 +90,8 @@ void addTrace(CLI::App& command, std::string& text) {
       .add_option("--trace", text,
                   "Which frames of the phone's streams the record has: none (off), or those of each diagnostic "
                   "(frames). After N frames, default 100000, every second one, after N more every fourth and so on; "
-                  "with frames=all every one. Default frames")
-      ->type_name("off|frames[=N|=all]");
+                  "with frames=all every one. queues: the tasks of the plug-in's queues, too. Default frames")
+      ->type_name("off|frames[=N|=all]|queues");
 }
 
 Choice choiceOf(const ChoiceTexts& texts) {

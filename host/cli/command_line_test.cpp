@@ -115,6 +115,9 @@ TEST(ParseCommandLine, ReadsWhichFramesAreRecorded) {
   EXPECT_EQ(parse({"run", "A", "--trace", "frames=7"}).options->trace.framesPerStep, 7U);
   EXPECT_EQ(parse({"run", "A", "--trace", "frames=all"}).options->trace.framesPerStep, 0U);
   EXPECT_TRUE(parse({"run", "A", "--trace", "frames=all"}).options->trace.isOn);
+  EXPECT_FALSE(parse({"run", "A", "--trace", "frames=all"}).options->trace.tasks);
+  EXPECT_TRUE(parse({"run", "A", "--trace", "queues"}).options->trace.isOn);
+  EXPECT_TRUE(parse({"run", "A", "--trace", "queues"}).options->trace.tasks);
   EXPECT_FALSE(parse({"analyze", "r"}).options->trace.isOn);
 }
 
@@ -302,7 +305,7 @@ TEST(ParseCommandLine, RefusesWrongUsage) {
       {{"run", "A", "--log-limit", "5,1048577"}, "--log-limit: MEBIBYTES '1048577': expected"},
       {{"run", "A", "--log-limit", "5,6,7"}, "--log-limit: MEBIBYTES '6,7': expected"},
       {{"list", "--log-limit", "5"}, "--log-limit"},
-      {{"run", "A", "--trace", "queue"}, "--trace 'queue': expected off, frames, frames=N or frames=all"},
+      {{"run", "A", "--trace", "queue"}, "--trace 'queue': expected off, frames, frames=N, frames=all or queues"},
       {{"run", "A", "--trace", "frames=0"}, "--trace: N '0': expected an integer from 1 to 1000000000"},
       {{"run", "A", "--trace", "frames=-1"}, "--trace: N '-1': expected an integer"},
       {{"run", "A", "--trace", "frames="}, "--trace: N '': expected an integer"},

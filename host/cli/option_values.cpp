@@ -85,9 +85,11 @@ LogLimit logLimitOf(const std::string& text) {
 TraceSetting traceOf(const std::string& text) {
   constexpr std::string_view kFrames = "frames=";
   TraceSetting setting{text != "off", TraceSetting::kDefaultFrames};
-  if (text == "off" || text == "frames") return setting;
+  setting.tasks = text == "queues";
+  if (text == "off" || text == "frames" || text == "queues") return setting;
   if (!text.starts_with(kFrames)) {
-    throw CommandError(ExitCode::kUsage, "--trace '" + text + "': expected off, frames, frames=N or frames=all");
+    throw CommandError(ExitCode::kUsage,
+                       "--trace '" + text + "': expected off, frames, frames=N, frames=all or queues");
   }
   const std::string number = text.substr(kFrames.size());
   setting.framesPerStep = number == "all" ? 0 : parseWhole("--trace: N", number, 1, kMaxTracedFramesPerStep);

@@ -27,7 +27,7 @@ std::optional<std::uint64_t> memoryOf(const std::string& text);
 // The limit of `--log-limit LINES[,MEBIBYTES]|none`; the default limit if the text is empty. Throws like parseWhole.
 LogLimit logLimitOf(const std::string& text);
 
-// The setting of `--trace off|frames[=N|=all]`. Throws like parseWhole.
+// The setting of `--trace off|frames[=N|=all]|queues`. Throws like parseWhole.
 TraceSetting traceOf(const std::string& text);
 
 // The level of that name; nothing if there is none.

@@ -65,7 +65,7 @@ class Completer {
     }
     if (option == "--log-level") return {"error", "default", "debug"};
     if (option == "--only") return {"failed"};
-    if (option == "--trace") return {"off", "frames", "frames=all"};
+    if (option == "--trace") return {"off", "frames", "frames=all", "queues"};
     if (option == "--log-limit" || option == "--memory") return {"none"};
     if (option == "--phone") return phones();
     if (option == "--profile" || option == "--parameters") return profiles(option == "--profile");

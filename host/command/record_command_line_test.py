@@ -134,12 +134,12 @@ class VerifyTest(RecordTest):
 
     def test_a_record_of_a_later_version_is_refused_with_both_versions(self):
         def later(events):
-            events[0]["record"] = 4
+            events[0]["record"] = 5
             events[2]["event"] = "somethingNew"
 
         record = self.changed(later)
         wrote = json.loads(record.read_text().splitlines()[0])["program"]
-        sentence = (f"the record '{record}' says version 4, but this program reads versions 1 to 3; read it with the quazor "
+        sentence = (f"the record '{record}' says version 5, but this program reads versions 1 to 4; read it with the quazor "
                     f"that wrote it, {wrote}, or a later one")
         for arguments in (["verify", record], ["diff", self.record, record], ["diff", record, self.record],
                           ["analyze", record, "--plugin", WORKING], ["run", "--only", "failed", "--of", record]):

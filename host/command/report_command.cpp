@@ -54,6 +54,7 @@ void writeTimeline(const Options& options, Console& console) {
 
 ShownRun shownRun(const RecordedRun& run, const std::filesystem::path& file) {
   ShownRun shown{run.began, run.records, run.streams};
+  shown.queues = &run.queues;
   shown.file = file.string();
   shown.hasEnded = run.ended.has_value();
   if (run.ended) {

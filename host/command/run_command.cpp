@@ -88,6 +88,7 @@ RunStarted beginningOf(const Options& options, const Installation& installation,
   if (options.choice.repetitions > 1) began.repetitions = options.choice.repetitions;
   began.acceptFlaky = options.choice.acceptFlaky;
   began.traced = options.trace.isOn;
+  began.tracesTasks = options.trace.tasks;
   began.ofExperiments = options.command == Command::kExperiment;
   for (const FailedPlugin& plugin : failed) began.names.push_back(plugin.file.filename().string());
   for (const Job& job : jobs) began.names.push_back(job.bound.described.diagnostic.name);

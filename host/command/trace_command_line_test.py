@@ -158,12 +158,61 @@ class TraceTest(RecordTest):
         self.assertEqual(quazor("verify", self.changed(early)).returncode, 0)
 
     def test_settings_that_are_refused(self):
-        for text in ("", "on", "queues", "frames=", "frames=0", "frames=-1", "frames=1.5", "frames=1000000001", "frames=ALL",
+        for text in ("", "on", "queue", "frames=", "frames=0", "frames=-1", "frames=1.5", "frames=1000000001", "frames=ALL",
                      "Frames", "off=1", "frames,off"):
             with self.subTest(text):
                 self.assert_refused(self.run_fake("--trace", text), 64, "--trace")
         self.assertEqual(quazor("analyze", self.record, "--trace", "off").returncode, 64)
         self.assertEqual(quazor("selftest", "--trace", "off").returncode, 64)
+
+
+class QueuesTest(RecordTest):
+    def record_of(self, *arguments):
+        result = quazor("run", "TesselFaultDiagnostic", "--profile", "none", "--set", "experiment.frameCount=40", "--set", "timeout=9",
+                        "--set", "analysis.frameCount=40", "--record", self.record, "--replace", *arguments)
+        self.assertEqual(result.returncode, 0, result.stdout + result.stderr)
+        return events_in(self.record)
+
+    def test_the_tasks_of_the_plug_in(self):
+        without = [event for event in self.record_of() if event["event"] == "frames"]
+        for mode in ([], ["--in-process"], ["--realtime"]):
+            with self.subTest(mode):
+                events = self.record_of("--trace", "queues", *mode)
+                self.assertEqual(events[0]["record"], 4)
+                self.assertEqual(quazor("verify", self.record).returncode, 0)
+                queues = {event["queue"]: event["columns"] for event in events if event["event"] == "tasks"}
+                self.assertEqual(sorted(queues), ["QZTesselFaultExperiment", "QZTesselFaultExperiment.primaryScalar"])
+                # A task for each frame that was taken in, and one for each that was examined.
+                self.assertGreaterEqual(len(queues["QZTesselFaultExperiment.primaryScalar"]["thread"]), 40)
+                self.assertGreaterEqual(len(queues["QZTesselFaultExperiment"]["thread"]), 40)
+                for columns in queues.values():
+                    posted, begun = itertools.accumulate(columns["posted"]), itertools.accumulate(columns["begun"])
+                    self.assertTrue(all(before <= at for before, at in zip(posted, begun)))
+                if mode == []:
+                    self.assertEqual([{**event, "sequence": 0} for event in events if event["event"] == "frames"],
+                                     [{**event, "sequence": 0} for event in without])
+
+    def test_two_runs_have_the_same_tasks(self):
+        self.record_of("--trace", "queues")
+        other = self.directory / "other.jsonl"
+        other.write_bytes(self.record.read_bytes())
+        self.record_of("--trace", "queues")
+        self.assertEqual(quazor("diff", self.record, other).stdout, "The records do not differ.\n")
+        text = other.read_text()
+        changed = re.sub(r'("event":"tasks","queue":"QZTesselFaultExperiment","step":1,"columns":{"thread":\[)1', r"\g<1>2", text)
+        self.assertNotEqual(text, changed)
+        other.write_text(changed)
+        self.assertIn("queue QZTesselFaultExperiment: task 1, the first that differs, was thread 1",
+                      quazor("diff", self.record, other).stdout)
+
+    def test_time_line_and_page(self):
+        self.record_of("--trace", "queues")
+        timeline, page = self.directory / "t.json", self.directory / "p.html"
+        self.assertEqual(quazor("report", self.record, "--format", "trace", "--output", timeline).returncode, 0)
+        names = [event["args"]["name"] for event in json.loads(timeline.read_text())["traceEvents"] if event["name"] == "thread_name"]
+        self.assertIn("tasks of QZTesselFaultExperiment", names)
+        self.assertEqual(quazor("report", self.record, "--output", page).returncode, 0)
+        self.assertIn("Tasks of queues", page.read_text())
 
 
 if __name__ == "__main__":

@@ -32,6 +32,7 @@ struct SharedFrames {
   };
 
   struct Ring {
+    std::uint64_t kind;
     std::uint64_t nameSize;
     char name[FrameRings::kMaxName];
     alignas(kCacheLine) std::uint64_t seen;  // frames that were delivered
@@ -48,7 +49,7 @@ struct SharedFrames {
     std::int64_t origin;
     std::uint64_t streams;
     std::uint64_t withoutRing;
-    alignas(kCacheLine) std::uint64_t seen;  // frames of all streams
+    alignas(kCacheLine) std::uint64_t seen[2];  // frames of all streams, and tasks of all queues
     Ring rings[FrameRings::kMaxStreams];
   };
 
@@ -119,6 +120,8 @@ void makeResident(Ring& ring) {
   static_cast<void>(::madvise(reinterpret_cast<std::byte*>(&ring) - before, sizeof ring + before, MADV_POPULATE_WRITE));
 }
 
+TracedKind kindIn(Ring& ring) { return load(ring.kind) == 0 ? TracedKind::kFrames : TracedKind::kTasks; }
+
 // 1 for the first `framesPerStep` frames, 2 for twice as many after them, and so on.
 std::uint64_t stepOf(std::uint64_t frame, std::uint64_t framesPerStep) {
   return framesPerStep == 0 ? 1 : std::bit_floor(frame / framesPerStep + 1);
@@ -129,11 +132,15 @@ class StreamOfRing final : public TracedStream {
  public:
   StreamOfRing(std::shared_ptr<SharedFrames> shared, Ring& ring, std::shared_ptr<const Clock> clock,
                WhenTraceIsFull whenFull)
-      : shared_(std::move(shared)), ring_(ring), clock_(std::move(clock)), whenFull_(whenFull) {}
+      : shared_(std::move(shared)),
+        ring_(ring),
+        isOfTasks_(kindIn(ring) == TracedKind::kTasks),
+        clock_(std::move(clock)),
+        whenFull_(whenFull) {}
 
   std::optional<std::uint64_t> deliver(std::uint64_t number, nanoseconds captured) override {
     SharedFrames::Content& all = *shared_->content;
-    const std::uint64_t step = stepOf(count(all.seen), all.framesPerStep);
+    const std::uint64_t step = stepOf(count(all.seen[isOfTasks_ ? 1 : 0]), all.framesPerStep);
     if (count(ring_.seen) % step != 0) return std::nullopt;
     std::uint64_t place = load(ring_.head, std::memory_order_acquire);
     nanoseconds now{};
@@ -180,6 +187,7 @@ class StreamOfRing final : public TracedStream {
 
   const std::shared_ptr<SharedFrames> shared_;
   Ring& ring_;
+  const bool isOfTasks_;
   const std::shared_ptr<const Clock> clock_;
   const WhenTraceIsFull whenFull_;
 };
@@ -194,6 +202,17 @@ void FrameRings::begin(nanoseconds origin) { shared_->content->origin = origin.c
 
 std::shared_ptr<TracedStream> FrameRings::addStream(const std::string& name, std::shared_ptr<const Clock> clock,
                                                     WhenTraceIsFull whenFull) {
+  return addRing(TracedKind::kFrames, name, std::move(clock), whenFull);
+}
+
+std::shared_ptr<TracedStream> FrameRings::addQueue(const std::string& name, std::shared_ptr<const Clock> clock,
+                                                   WhenTraceIsFull whenFull) {
+  return addRing(TracedKind::kTasks, name, std::move(clock), whenFull);
+}
+
+std::shared_ptr<TracedStream> FrameRings::addRing(TracedKind kind, const std::string& name,
+                                                  std::shared_ptr<const Clock> clock, WhenTraceIsFull whenFull) {
+  const std::lock_guard lock(adding_);
   SharedFrames::Content& all = *shared_->content;
   const std::uint64_t index = load(all.streams);
   if (index >= kMaxStreams) {
@@ -201,6 +220,7 @@ std::shared_ptr<TracedStream> FrameRings::addStream(const std::string& name, std
     return nullptr;
   }
   Ring& ring = all.rings[index];
+  ring.kind = kind == TracedKind::kFrames ? 0 : 1;
   ring.nameSize = std::min(name.size(), kMaxName);
   std::memcpy(ring.name, name.data(), ring.nameSize);
   // In virtual time, where frames wait for room, this would only take real time.
@@ -224,7 +244,8 @@ void FrameDrain::findStreams() {
     const std::string name(ring.name, std::min<std::uint64_t>(load(ring.nameSize), FrameRings::kMaxName));
     Stream stream;
     stream.name = name;
-    const auto isTaken = [&stream](const Stream& one) { return one.name == stream.name; };
+    stream.kind = kindIn(ring);
+    const auto isTaken = [&stream](const Stream& one) { return one.kind == stream.kind && one.name == stream.name; };
     for (int number = 2; std::any_of(streams_.begin(), streams_.end(), isTaken); ++number) {
       stream.name = name + " (" + std::to_string(number) + ")";
     }

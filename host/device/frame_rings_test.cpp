@@ -180,6 +180,22 @@ TEST_F(FrameRingsTest, TellEverySecondFrameAfterManyAndThenEveryFourth) {
   EXPECT_EQ(drain_->takeLost(0), 0U);
 }
 
+TEST_F(FrameRingsTest, TellTasksAsFramesAndCountThemOnTheirOwn) {
+  make(4);
+  const std::shared_ptr<TracedStream> queue = rings_->addQueue("wide", clock_, WhenTraceIsFull::kLose);
+  const std::shared_ptr<TracedStream> other = rings_->addQueue("wide", clock_, WhenTraceIsFull::kLose);
+  for (std::uint64_t i = 0; i < 4; ++i) pass(*wide_, i);
+  for (std::uint64_t i = 10; i < 14; ++i) pass(*queue, i);
+  EXPECT_EQ(numbers(), (std::vector<std::int64_t>{0, 1, 2, 3, 10, 11, 12, 13}));
+  for (std::uint64_t i = 14; i < 18; ++i) pass(*queue, i);
+  EXPECT_EQ(numbers(), (std::vector<std::int64_t>{14, 16}));
+  EXPECT_EQ(drain_->kindOf(0), TracedKind::kFrames);
+  EXPECT_EQ(drain_->kindOf(2), TracedKind::kTasks);
+  EXPECT_EQ(drain_->nameOf(0), "wide");
+  EXPECT_EQ(drain_->nameOf(2), "wide");
+  EXPECT_EQ(drain_->nameOf(3), "wide (2)");
+}
+
 TEST_F(FrameRingsTest, HaveAtMostSoManyStreams) {
   make();
   for (std::size_t i = 2; i < FrameRings::kMaxStreams; ++i) {
@@ -303,9 +319,9 @@ TEST(FrameDrainTest, WithstandsAnythingInItsMemory) {
         EXPECT_TRUE(std::has_single_bit(step));
       });
       ASSERT_LE(drain.size(), FrameRings::kMaxStreams);
-      std::set<std::string> names;
+      std::set<std::pair<TracedKind, std::string>> names;
       for (std::size_t i = 0; i < drain.size(); ++i) {
-        names.insert(drain.nameOf(i));
+        names.emplace(drain.kindOf(i), drain.nameOf(i));
         EXPECT_LE(drain.nameOf(i).size(), FrameRings::kMaxName + 5);
         drain.takeLost(i);
       }

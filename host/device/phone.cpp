@@ -36,6 +36,7 @@ class PhoneOfScenario final : public Phone {
 
   std::uint64_t framesDelivered() const override { return phone_.framesDelivered(); }
   void traceFrames(FrameTrace& trace) override { phone_.traceFrames(trace); }
+  WhenTraceIsFull whenTraceIsFull() const override { return phone_.whenTraceIsFull(); }
 
  private:
   SimulatedPhone phone_;

@@ -1,6 +1,7 @@
 // The phones that diagnostics run on. Only phone.cpp names the backends.
 #pragma once
 
+#include "backends/capture/frame_trace.h"
 #include "contract/log_channel.h"
 #include "host/device/expected_outcome.h"
 #include "host/device/skip.h"
@@ -19,8 +20,6 @@
 #include <vector>
 
 namespace quazor {
-
-class FrameTrace;
 
 // A fault that the scenario or binding declares, and the number of calls that it changed.
 struct DeclaredFault {
@@ -44,6 +43,8 @@ class Phone {
   // From now on, each frame that its cameras deliver is told to streams of the trace. Called once, before any stream is
   // started. The streams keep what they need.
   virtual void traceFrames(FrameTrace& trace) = 0;
+  // What becomes of a task for which the trace has no room.
+  virtual WhenTraceIsFull whenTraceIsFull() const { return WhenTraceIsFull::kLose; }
 };
 
 // Creates a new phone on every call, all in the same initial state.

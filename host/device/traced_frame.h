@@ -17,6 +17,10 @@ struct TracedFrame {
   friend bool operator==(const TracedFrame&, const TracedFrame&) = default;
 };
 
+// What rows tell. A task of a serial queue is told as a frame is: its number is that of its thread, it is captured when
+// it is posted, delivered when it begins, and returned when it has ended.
+enum class TracedKind { kFrames, kTasks };
+
 // The largest number and time, and the negative of the smallest time: their differences fit 64 bits.
 inline constexpr std::int64_t kMaxTraced = (std::int64_t{1} << 62) - 1;
 

@@ -42,6 +42,7 @@ struct RunStarted {
   std::uint64_t repetitions = 0;
   bool acceptFlaky = false;  // a pass after an error does not make the run an error
   bool traced = false;       // the frames of the cameras are told, too
+  bool tracesTasks = false;  // so are the tasks of the plug-in's queues
   // Only of an analysis. If its record is itself that of an analysis, this is the run that measured.
   std::optional<AnalyzedRun> analyzed{};
 };
@@ -113,12 +114,14 @@ struct Heartbeat {
   Date date{};
 };
 
-// Frames of one stream of the phone, in the order of their delivery. The phone tells them, not the plug-in.
+// Frames of one stream of the phone, in the order of their delivery, or tasks of one queue, in the order in which they
+// begin. The phone and the host tell them, not the plug-in.
 struct FramesTraced {
-  std::string stream;
+  std::string stream;               // or queue
   std::uint64_t step = 1;           // 1: every frame; 2: every second one
   std::vector<TracedFrame> frames;  // at most kMaxTracedFrames
   std::uint64_t lost = 0;           // for which there was no room, and which were not told before
+  TracedKind kind = TracedKind::kFrames;
 };
 
 // The plug-in has finished; only the host sends further events of this diagnostic.

@@ -19,10 +19,39 @@ using Json = nlohmann::ordered_json;
 
 namespace {
 
-constexpr const char* kNumber = "number";
-constexpr const char* kCaptured = "captured";
-constexpr const char* kDelivered = "delivered";
-constexpr const char* kReturned = "returned";
+// How an event of a kind is written, and what the refusals of a reader call it.
+struct Names {
+  const char* event;
+  const char* stream;
+  const char* number;
+  const char* captured;
+  const char* delivered;
+  const char* returned;
+  const char* rows;
+  const char* negative;
+  const char* goesBack;
+};
+
+constexpr Names kOfFrames{"frames",
+                          "stream",
+                          "number",
+                          "captured",
+                          "delivered",
+                          "returned",
+                          "frames",
+                          "a frame's number is negative",
+                          "the frame was delivered before the one before it"};
+constexpr Names kOfTasks{"tasks",
+                         "queue",
+                         "thread",
+                         "posted",
+                         "begun",
+                         "ended",
+                         "tasks",
+                         "a thread's number is negative",
+                         "the task began before the one before it"};
+
+const Names& namesOf(TracedKind kind) { return kind == TracedKind::kFrames ? kOfFrames : kOfTasks; }
 
 Json columnJson(const std::vector<TracedFrame>& frames, std::optional<std::int64_t> (*valueOf)(const TracedFrame&)) {
   Json column = Json::array();
@@ -39,10 +68,12 @@ Json columnJson(const std::vector<TracedFrame>& frames, std::optional<std::int64
 // Thread: one at a time.
 class Column {
  public:
-  Column(const Json& columns, const char* name, std::size_t size) : name_(name), entries_(arrayAt(columns, name)) {
+  // `first` is the column with the expected size.
+  Column(const Json& columns, const char* name, const char* first, std::size_t size)
+      : name_(name), entries_(arrayAt(columns, name)) {
     if (entries_.size() != size) {
       throw InputError(
-          formatMessage("the column \"%@\" has %@ entries, but \"%@\" has %@", name_, entries_.size(), kNumber, size));
+          formatMessage("the column \"%@\" has %@ entries, but \"%@\" has %@", name_, entries_.size(), first, size));
     }
   }
 
@@ -74,59 +105,59 @@ class Column {
   std::int64_t last_ = 0;
 };
 
-void refuseOtherColumns(const Json& columns) {
+void refuseOtherColumns(const Json& columns, const Names& names) {
   if (!columns.is_object()) throw InputError("\"columns\" is not an object");
   for (const auto& [name, column] : columns.items()) {
-    if (name != kNumber && name != kCaptured && name != kDelivered && name != kReturned) {
+    if (name != names.number && name != names.captured && name != names.delivered && name != names.returned) {
       throw InputError("unknown column '" + name + "'");
     }
   }
 }
 
-std::vector<TracedFrame> rowsOf(const Json& columns) {
-  refuseOtherColumns(columns);
-  const std::size_t size = arrayAt(columns, kNumber).size();
+std::vector<TracedFrame> rowsOf(const Json& columns, const Names& names) {
+  refuseOtherColumns(columns, names);
+  const std::size_t size = arrayAt(columns, names.number).size();
   if (size > kMaxTracedFrames) {
     throw InputError(
-        formatMessage("\"columns\" has %@ frames, but at most %@ are told at once", size, kMaxTracedFrames));
+        formatMessage("\"columns\" has %@ %@, but at most %@ are told at once", size, names.rows, kMaxTracedFrames));
   }
-  Column number(columns, kNumber, size);
-  Column captured(columns, kCaptured, size);
-  Column delivered(columns, kDelivered, size);
-  Column returned(columns, kReturned, size);
-  std::vector<TracedFrame> frames;
-  frames.reserve(size);
+  Column number(columns, names.number, names.number, size);
+  Column captured(columns, names.captured, names.number, size);
+  Column delivered(columns, names.delivered, names.number, size);
+  Column returned(columns, names.returned, names.number, size);
+  std::vector<TracedFrame> rows;
+  rows.reserve(size);
   for (std::size_t i = 0; i < size; ++i) {
-    const TracedFrame frame{number.valueAt(i), captured.valueAt(i), delivered.valueAt(i), returned.at(i)};
-    if (frame.number < 0) number.refuse(i, "a frame's number is negative");
-    if (i > 0 && frame.delivered < frames.back().delivered) {
-      delivered.refuse(i, "the frame was delivered before the one before it");
-    }
-    frames.push_back(frame);
+    const TracedFrame row{number.valueAt(i), captured.valueAt(i), delivered.valueAt(i), returned.at(i)};
+    if (row.number < 0) number.refuse(i, names.negative);
+    if (i > 0 && row.delivered < rows.back().delivered) delivered.refuse(i, names.goesBack);
+    rows.push_back(row);
   }
-  return frames;
+  return rows;
 }
 
 }  // namespace
 
 Json framesJson(const FramesTraced& event) {
-  using Frame = const TracedFrame&;
+  using Row = const TracedFrame&;
   using Entry = std::optional<std::int64_t>;
-  Json json = {{"event", "frames"}, {"stream", losslessText(event.stream)}, {"step", event.step}};
-  json["columns"] = {{kNumber, columnJson(event.frames, [](Frame one) { return Entry(one.number); })},
-                     {kCaptured, columnJson(event.frames, [](Frame one) { return Entry(one.captured); })},
-                     {kDelivered, columnJson(event.frames, [](Frame one) { return Entry(one.delivered); })},
-                     {kReturned, columnJson(event.frames, [](Frame one) { return one.returned; })}};
+  const Names& names = namesOf(event.kind);
+  Json json = {{"event", names.event}, {names.stream, losslessText(event.stream)}, {"step", event.step}};
+  json["columns"] = {{names.number, columnJson(event.frames, [](Row one) { return Entry(one.number); })},
+                     {names.captured, columnJson(event.frames, [](Row one) { return Entry(one.captured); })},
+                     {names.delivered, columnJson(event.frames, [](Row one) { return Entry(one.delivered); })},
+                     {names.returned, columnJson(event.frames, [](Row one) { return one.returned; })}};
   if (event.lost > 0) json["lost"] = event.lost;
   return json;
 }
 
-FramesTraced framesFrom(const Json& json) {
-  FramesTraced event{textAt(json, "stream"), get<std::uint64_t>(json, "step"), {}, 0};
+FramesTraced framesFrom(const Json& json, TracedKind kind) {
+  const Names& names = namesOf(kind);
+  FramesTraced event{textAt(json, names.stream), get<std::uint64_t>(json, "step"), {}, 0, kind};
   if (!std::has_single_bit(event.step)) {
     throw InputError(formatMessage("\"step\" is %@, but must be 1 or another power of two", event.step));
   }
-  event.frames = rowsOf(memberOf(json, "columns"));
+  event.frames = rowsOf(memberOf(json, "columns"), names);
   event.lost = countAt(json, "lost");
   return event;
 }

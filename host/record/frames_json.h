@@ -1,4 +1,4 @@
-// The event `frames` in JSON: the frames of a stream in columns.
+// The events `frames` and `tasks` in JSON: the frames of a stream, or the tasks of a queue, in columns.
 #pragma once
 
 #include "host/model/run_event.h"
@@ -12,6 +12,6 @@ namespace quazor {
 nlohmann::ordered_json framesJson(const FramesTraced& event);
 
 // Throws InputError, which names the column and the entry, if the JSON is not that of an event.
-FramesTraced framesFrom(const nlohmann::ordered_json& json);
+FramesTraced framesFrom(const nlohmann::ordered_json& json, TracedKind kind);
 
 }  // namespace quazor

@@ -17,14 +17,14 @@ namespace {
 using Json = nlohmann::ordered_json;
 
 std::string problemOf(const std::string& json) {
-  return thrownText<InputError>([&] { framesFrom(Json::parse(json)); }, "accepted");
+  return thrownText<InputError>([&] { framesFrom(Json::parse(json), TracedKind::kFrames); }, "accepted");
 }
 
 std::string withColumns(const std::string& columns) {
   return R"({"event":"frames","stream":"front","step":1,"columns":{)" + columns + "}}";
 }
 
-FramesTraced back(const FramesTraced& event) { return framesFrom(Json::parse(framesJson(event).dump())); }
+FramesTraced back(const FramesTraced& event) { return framesFrom(Json::parse(framesJson(event).dump()), event.kind); }
 
 TEST(FramesJson, HasAColumnOfDifferencesForEachMember) {
   const FramesTraced event{
@@ -37,6 +37,34 @@ TEST(FramesJson, HasAColumnOfDifferencesForEachMember) {
   EXPECT_EQ(read.step, 2U);
   EXPECT_EQ(read.frames, event.frames);
   EXPECT_EQ(read.lost, 5U);
+}
+
+TEST(FramesJson, HasOtherNamesForTasks) {
+  const FramesTraced event{"Work", 1, {{1, 5, 10, 20}, {2, 15, 25, std::nullopt}}, 3, TracedKind::kTasks};
+  const std::string text =
+      R"({"event":"tasks","queue":"Work","step":1,"columns":{"thread":[1,1],"posted":[5,10],"begun":[10,15],)"
+      R"("ended":[20,null]},"lost":3})";
+  EXPECT_EQ(framesJson(event).dump(), text);
+  const FramesTraced read = back(event);
+  EXPECT_EQ(read.stream, "Work");
+  EXPECT_EQ(read.frames, event.frames);
+  EXPECT_EQ(read.kind, TracedKind::kTasks);
+  const auto problem = [](const std::string& columns) {
+    return thrownText<InputError>(
+        [&] {
+          framesFrom(Json::parse(R"({"event":"tasks","queue":"Q","step":1,"columns":{)" + columns + "}}"),
+                     TracedKind::kTasks);
+        },
+        "accepted");
+  };
+  EXPECT_EQ(problem(R"("thread":[1],"posted":[1],"begun":[1],"ended":[1])"), "accepted");
+  EXPECT_EQ(problem(R"("thread":[1],"posted":[1],"begun":[1],"returned":[1])"), "unknown column 'returned'");
+  EXPECT_EQ(problem(R"("thread":[1],"posted":[1,2],"begun":[1],"ended":[1])"),
+            "the column \"posted\" has 2 entries, but \"thread\" has 1");
+  EXPECT_EQ(problem(R"("thread":[-1],"posted":[1],"begun":[1],"ended":[1])"),
+            "the column \"thread\", entry 1: a thread's number is negative");
+  EXPECT_EQ(problem(R"("thread":[1,0],"posted":[1,0],"begun":[1,-1],"ended":[1,0])"),
+            "the column \"begun\", entry 2: the task began before the one before it");
 }
 
 TEST(FramesJson, OmitsTheLostFramesIfThereAreNone) {

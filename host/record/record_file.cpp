@@ -3,6 +3,7 @@
 #include "base/json/json_limits.h"
 #include "base/json/json_line.h"
 #include "base/text/input_error.h"
+#include "contract/message_format.h"
 #include "host/error/exit_code.h"
 #include "host/model/record_builder.h"
 #include "host/record/lossless_json.h"
@@ -106,13 +107,13 @@ void checkVersion(const std::filesystem::path& file, const Json& json) {
     throw InputError("the version of the record is " + version.dump() + ", but must be a number from " +
                      std::to_string(kFirstRecordFormat));
   }
-  if (version <= kRecordFormatWithFrames) return;
+  if (version <= kRecordFormatWithTasks) return;
   const auto program = json.find("program");
   const std::string writer = program != json.end() && program->is_string() ? ", " + textFrom(*program) : "";
   throw CommandError(ExitCode::kCannotRead,
                      "the record '" + file.string() + "' says version " + version.dump() +
                          ", but this program reads versions " + std::to_string(kFirstRecordFormat) + " to " +
-                         std::to_string(kRecordFormatWithFrames) + "; read it with the quazor that wrote it" + writer +
+                         std::to_string(kRecordFormatWithTasks) + "; read it with the quazor that wrote it" + writer +
                          ", or a later one");
 }
 
@@ -141,27 +142,38 @@ class FrameOrder {
  public:
   // Throws InputError.
   void check(const RunEvent& event) {
-    if (const auto* const began = std::get_if<RunStarted>(&event)) isTraced_ = began->traced;
+    if (const auto* const began = std::get_if<RunStarted>(&event)) {
+      isTraced_ = began->traced;
+      tracesTasks_ = began->tracesTasks;
+    }
     if (std::holds_alternative<DiagnosticStarted>(event)) delivered_.clear();
     const auto* const traced = std::get_if<FramesTraced>(&event);
     if (traced == nullptr) return;
-    if (!isTraced_) {
-      throw InputError("a record has the event 'frames' from version " + std::to_string(kRecordFormatWithFrames) +
-                       " on");
+    const bool isOfTasks = traced->kind == TracedKind::kTasks;
+    if (!(isOfTasks ? tracesTasks_ : isTraced_)) {
+      throw InputError(formatMessage("a record has the event '%@' from version %@ on", isOfTasks ? "tasks" : "frames",
+                                     isOfTasks ? kRecordFormatWithTasks : kRecordFormatWithFrames));
     }
     if (traced->frames.empty()) return;
-    const auto [last, isFirst] = delivered_.try_emplace(traced->stream, traced->frames.front().delivered);
+    const auto [last, isFirst] =
+        delivered_.try_emplace({traced->kind, traced->stream}, traced->frames.front().delivered);
     if (traced->frames.front().delivered < last->second) {
-      throw InputError(
-          "the column \"delivered\", entry 1: the frame was delivered before the last one of the stream '" +
-          traced->stream + "' in an earlier line");
+      throw InputError(isOfTasks
+                           ? formatMessage("the column \"begun\", entry 1: the task began before the last one of the "
+                                           "queue '%@' in an earlier line",
+                                           traced->stream)
+                           : formatMessage("the column \"delivered\", entry 1: the frame was delivered before the "
+                                           "last one of the stream '%@' in an earlier line",
+                                           traced->stream));
     }
     last->second = traced->frames.back().delivered;
   }
 
  private:
   bool isTraced_ = false;
-  std::map<std::string, std::int64_t, std::less<>> delivered_;  // the last frame of each stream of the diagnostic
+  bool tracesTasks_ = false;
+  // The last frame of each stream of the diagnostic, and the last task of each queue.
+  std::map<std::pair<TracedKind, std::string>, std::int64_t> delivered_;
 };
 
 }  // namespace
@@ -175,7 +187,7 @@ std::uint64_t RecordedStream::stepAt(std::size_t index) const {
 void addFrames(std::vector<RecordedStream>& streams, FramesTraced&& event) {
   auto stream = std::find_if(streams.begin(), streams.end(),
                              [&event](const RecordedStream& one) { return one.name == event.stream; });
-  if (stream == streams.end()) stream = streams.insert(streams.end(), {event.stream, {}, 0});
+  if (stream == streams.end()) stream = streams.insert(streams.end(), {event.stream, {}, 0, {}, event.kind});
   if (stream->steps.empty() || stream->steps.back().step != event.step) {
     stream->steps.push_back({stream->frames.size(), event.step});
   }
@@ -184,10 +196,18 @@ void addFrames(std::vector<RecordedStream>& streams, FramesTraced&& event) {
   event.frames = {};
 }
 
+namespace {
+
+int formatOf(const RunStarted& began) {
+  return began.tracesTasks ? kRecordFormatWithTasks : began.traced ? kRecordFormatWithFrames : kRecordFormat;
+}
+
+}  // namespace
+
 std::string recordLine(const RunEvent& event, std::uint64_t sequence) {
   Json line = {{"sequence", sequence}};
   const auto* const began = std::get_if<RunStarted>(&event);
-  if (sequence == 0) line["record"] = began != nullptr && began->traced ? kRecordFormatWithFrames : kRecordFormat;
+  if (sequence == 0) line["record"] = began == nullptr ? kRecordFormat : formatOf(*began);
   line.update(eventJson(event));
   return line.dump(-1, ' ', false, Json::error_handler_t::replace) + "\n";
 }
@@ -357,13 +377,17 @@ RecordedRun recordedRunOf(StoredRecord stored) {
   RecordedRun run;
   RecordBuilder builder;
   std::vector<RecordedStream> streams;
+  std::vector<RecordedStream> queues;
   const auto take = [&] {
     run.records.push_back(builder.takeRecord());
     run.streams.push_back(std::exchange(streams, {}));
+    run.queues.push_back(std::exchange(queues, {}));
   };
   for (RunEvent& event : stored.events) {
     builder.onEvent(event);
-    if (auto* const traced = std::get_if<FramesTraced>(&event)) addFrames(streams, std::move(*traced));
+    if (auto* const traced = std::get_if<FramesTraced>(&event)) {
+      addFrames(traced->kind == TracedKind::kFrames ? streams : queues, std::move(*traced));
+    }
     if (const auto* const began = std::get_if<RunStarted>(&event)) run.began = *began;
     if (const auto* const ended = std::get_if<RunEnded>(&event)) run.ended = *ended;
     if (std::holds_alternative<DiagnosticEnded>(event)) take();

@@ -95,18 +95,19 @@ struct TracedStep {
   std::uint64_t step = 1;
 };
 
-// The frames of a stream in one run of a diagnostic.
+// The frames of a stream, or the tasks of a queue, in one run of a diagnostic.
 struct RecordedStream {
   std::string name;
   std::vector<TracedFrame> frames;  // in the order of their delivery
   std::uint64_t lost = 0;
   std::vector<TracedStep> steps{};  // ascending
+  TracedKind kind = TracedKind::kFrames;
 
   // The step at the frame with that index.
   std::uint64_t stepAt(std::size_t index) const;
 };
 
-// Moves the frames to the stream of that name, a new one at first.
+// Moves the frames to the stream of that name, a new one at first. All are of one kind.
 void addFrames(std::vector<RecordedStream>& streams, FramesTraced&& event);
 
 // The run stored in a record. Incomplete diagnostics have the verdict kError.
@@ -116,6 +117,7 @@ struct RecordedRun {
   std::optional<RunEnded> ended;                       // nothing: the run did not end
   bool isLastOpen = false;                             // the diagnostic of the last record did not end
   std::vector<std::vector<RecordedStream>> streams{};  // those of each of the records
+  std::vector<std::vector<RecordedStream>> queues{};   // likewise
 };
 
 // The run that the events tell, whose first is a RunStarted.

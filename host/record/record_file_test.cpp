@@ -159,8 +159,8 @@ TEST_F(RecordFileTest, RefusesARecordThatWasChanged) {
   EXPECT_THAT(refusalOfText(changed([](auto& copy) { copy[2] = ""; })), HasSubstr("line 3: not valid JSON"));
   EXPECT_THAT(refusalOfText(changed([](auto& copy) { copy[2] = "[2]"; })), HasSubstr("line 3: expected an object"));
   EXPECT_THAT(refusalOfText(replaced(2, "stageBegan", "stageBegun")), HasSubstr("line 3: unknown event 'stageBegun'"));
-  EXPECT_THAT(refusalOfText(replaced(0, R"("record":2)", R"("record":4)")),
-              HasSubstr("' says version 4, but this program reads versions 1 to 3; read it with the quazor that wrote "
+  EXPECT_THAT(refusalOfText(replaced(0, R"("record":2)", R"("record":5)")),
+              HasSubstr("' says version 5, but this program reads versions 1 to 4; read it with the quazor that wrote "
                         "it, 0.1.0, or a later one"));
   EXPECT_THAT(refusalOfText(replaced(0, R"("record":2)", R"("record":0)")),
               HasSubstr("line 1: the version of the record is 0, but must be a number from 1"));

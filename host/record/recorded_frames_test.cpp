@@ -94,6 +94,29 @@ TEST_F(RecordedFramesTest, AreRefusedInARecordOfAnEarlierVersion) {
               EndsWith("record', line 4: a record has the event 'frames' from version 3 on"));
 }
 
+TEST_F(RecordedFramesTest, MayHaveTasksBesideThem) {
+  const RunEvent tasks = FramesTraced{"front", 1, {{1, 5, 10, 20}}, 1, TracedKind::kTasks};
+  const RunEvent later = FramesTraced{"front", 1, {{1, 5, 9, 20}}, 0, TracedKind::kTasks};
+  const RunEvent earlierFrame = frames("front", {{0, 0, 1, 1}});
+  std::vector<RunEvent> events = runWith({tasks, earlierFrame});
+  EXPECT_THAT(refusalOfRun(events), EndsWith("record', line 4: a record has the event 'tasks' from version 4 on"));
+  std::get<RunStarted>(events[0]).tracesTasks = true;
+  const fs::path file = write(events);
+  EXPECT_THAT(directory_.read("record"), StartsWith(R"({"sequence":0,"record":4,"event":"runBegan",)"));
+  const RecordedRun run = runIn(file);
+  EXPECT_TRUE(run.began.traced);
+  EXPECT_TRUE(run.began.tracesTasks);
+  ASSERT_EQ(run.queues[0].size(), 1U);
+  EXPECT_EQ(run.queues[0][0].name, "front");
+  EXPECT_EQ(run.queues[0][0].frames, std::vector<TracedFrame>({{1, 5, 10, 20}}));
+  EXPECT_EQ(run.queues[0][0].lost, 1U);
+  ASSERT_EQ(run.streams[0].size(), 1U);
+  events.insert(events.begin() + 5, later);
+  EXPECT_THAT(refusalOfRun(events),
+              EndsWith("line 6: the column \"begun\", entry 1: the task began before the last one of "
+                       "the queue 'front' in an earlier line"));
+}
+
 TEST_F(RecordedFramesTest, AreRefusedWithLineAndColumn) {
   write(runWith({frames("front", {{0, 5, 10, 20}, {1, 6, 11, 20}})}));
   std::string text = directory_.read("record");

@@ -213,7 +213,8 @@ RunEvent readRunBegan(const Json& json) {
                     countAt(json, "attempts"),
                     countAt(json, "repetitions"),
                     json.contains("acceptFlaky") && get<bool>(json, "acceptFlaky"),
-                    json.contains("record") && json["record"] == kRecordFormatWithFrames,
+                    json.contains("record") && json["record"] >= kRecordFormatWithFrames,
+                    json.contains("record") && json["record"] == kRecordFormatWithTasks,
                     analyzedAt(json, "analyzed")};
 }
 
@@ -370,7 +371,8 @@ RunEvent readHeartbeat(const Json& json) {
 
 Json jsonOf(const FramesTraced& event) { return framesJson(event); }
 
-RunEvent readFrames(const Json& json) { return framesFrom(json); }
+RunEvent readFrames(const Json& json) { return framesFrom(json, TracedKind::kFrames); }
+RunEvent readTasks(const Json& json) { return framesFrom(json, TracedKind::kTasks); }
 
 Json jsonOf(const DiagnosticCompleted& /*event*/) { return {{"event", "diagnosticCompleted"}}; }
 
@@ -417,6 +419,7 @@ constexpr Reader kReaders[] = {{"runBegan", readRunBegan},
                                {"skipped", readSkipped},
                                {"heartbeat", readHeartbeat},
                                {"frames", readFrames},
+                               {"tasks", readTasks},
                                {"diagnosticCompleted", readDiagnosticCompleted},
                                {"diagnosticEnded", readDiagnosticEnded},
                                {"runEnded", readRunEnded}};

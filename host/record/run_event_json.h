@@ -9,9 +9,10 @@
 
 namespace quazor {
 
-// The version of the record format, and of one with the event `frames`.
+// The version of the record format, of one with the event `frames`, and of one with `frames` and `tasks`.
 inline constexpr int kRecordFormat = 2;
 inline constexpr int kRecordFormatWithFrames = 3;
+inline constexpr int kRecordFormatWithTasks = 4;
 
 nlohmann::ordered_json eventJson(const RunEvent& event);
 

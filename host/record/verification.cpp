@@ -104,8 +104,10 @@ class Verifier {
       wasSkipped_ = false;
     }
     if (std::holds_alternative<DiagnosticSkipped>(event)) wasSkipped_ = true;
-    if (std::holds_alternative<FramesTraced>(event) && builder_.isOpen() && builder_.record().stages.empty()) {
-      add(builder_.record().name + ": frames are recorded before its first stage");
+    if (const auto* const traced = std::get_if<FramesTraced>(&event);
+        traced != nullptr && builder_.isOpen() && builder_.record().stages.empty()) {
+      add(builder_.record().name + (traced->kind == TracedKind::kFrames ? ": frames" : ": tasks") +
+          " are recorded before its first stage");
     }
     if (std::holds_alternative<DiagnosticEnded>(event)) checkVerdict();
   }

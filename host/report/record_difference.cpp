@@ -74,11 +74,22 @@ void compare(const std::string& name, const Facts& before, const Facts& after, s
   }
 }
 
-std::string textOf(const TracedFrame& frame) {
+std::string textOf(const TracedFrame& frame, TracedKind kind) {
+  if (kind == TracedKind::kTasks) {
+    const std::string ended = frame.returned ? formatMessage("ended at %@ ns", *frame.returned) : "not ended";
+    return formatMessage("thread %@, posted at %@ ns, begun at %@ ns, %@", frame.number, frame.captured,
+                         frame.delivered, ended);
+  }
   const std::string returned = frame.returned ? formatMessage("returned at %@ ns", *frame.returned) : "not returned";
   return formatMessage("number %@, captured at %@ ns, delivered at %@ ns, %@", frame.number, frame.captured,
                        frame.delivered, returned);
 }
+
+// What the sentences call a stream, and what it has.
+std::string nameOf(const RecordedStream& stream) {
+  return (stream.kind == TracedKind::kFrames ? "stream " : "queue ") + stream.name;
+}
+const char* rowsOf(const RecordedStream& stream) { return stream.kind == TracedKind::kFrames ? "frame" : "task"; }
 
 const RecordedStream* streamNamed(const std::vector<RecordedStream>& streams, const std::string& name) {
   const auto found =
@@ -86,7 +97,7 @@ const RecordedStream* streamNamed(const std::vector<RecordedStream>& streams, co
   return found == streams.end() ? nullptr : &*found;
 }
 
-// Adds the first frame that differs.
+// Adds the first frame or task that differs.
 void compareFrames(const std::string& name, const RecordedStream& before, const RecordedStream& after,
                    std::vector<Difference>& differences) {
   const auto [one, other] =
@@ -94,11 +105,11 @@ void compareFrames(const std::string& name, const RecordedStream& before, const 
   const bool isInFirst = one != before.frames.end();
   const bool isInSecond = other != after.frames.end();
   if (!isInFirst && !isInSecond) return;
-  differences.push_back(
-      {name,
-       formatMessage("stream %@: frame %@, the first that differs,", before.name, one - before.frames.begin() + 1),
-       isInFirst ? std::optional(textOf(*one)) : std::nullopt,
-       isInSecond ? std::optional(textOf(*other)) : std::nullopt});
+  differences.push_back({name,
+                         formatMessage("%@: %@ %@, the first that differs,", nameOf(before), rowsOf(before),
+                                       one - before.frames.begin() + 1),
+                         isInFirst ? std::optional(textOf(*one, before.kind)) : std::nullopt,
+                         isInSecond ? std::optional(textOf(*other, before.kind)) : std::nullopt});
 }
 
 void compareStreams(const std::string& name, const std::vector<RecordedStream>& before,
@@ -106,18 +117,18 @@ void compareStreams(const std::string& name, const std::vector<RecordedStream>& 
   for (const RecordedStream& stream : before) {
     const RecordedStream* const other = streamNamed(after, stream.name);
     if (other == nullptr) {
-      differences.push_back({name, "stream " + stream.name, "", std::nullopt});
+      differences.push_back({name, nameOf(stream), "", std::nullopt});
       continue;
     }
     compareFrames(name, stream, *other, differences);
     if (stream.lost != other->lost) {
-      differences.push_back({name, formatMessage("stream %@: the number of lost frames", stream.name),
+      differences.push_back({name, formatMessage("%@: the number of lost %@s", nameOf(stream), rowsOf(stream)),
                              std::to_string(stream.lost), std::to_string(other->lost)});
     }
   }
   for (const RecordedStream& stream : after) {
     if (streamNamed(before, stream.name) == nullptr) {
-      differences.push_back({name, "stream " + stream.name, std::nullopt, ""});
+      differences.push_back({name, nameOf(stream), std::nullopt, ""});
     }
   }
 }
@@ -128,23 +139,27 @@ class ComparedRun {
  public:
   // Borrows the run.
   explicit ComparedRun(const RecordedRun& run) : facts(factsOf(run)) {
-    if (!run.began.traced) return;
-    for (std::size_t i = 0; i < run.streams.size(); ++i) {
-      streams_.set(run.records[i].name + trialSuffix(run.records[i]), &run.streams[i]);
+    for (std::size_t i = 0; i < run.records.size(); ++i) {
+      const std::string name = run.records[i].name + trialSuffix(run.records[i]);
+      if (run.began.traced && i < run.streams.size()) streams.set(name, &run.streams[i]);
+      if (run.began.tracesTasks && i < run.queues.size()) queues.set(name, &run.queues[i]);
     }
   }
 
-  // The streams of the diagnostic; null if they were not recorded.
-  const std::vector<RecordedStream>* streamsOf(const std::string& name) const {
-    const auto* const found = streams_.find(name);
-    return found == nullptr ? nullptr : *found;
-  }
+  using Streams = OrderedMap<const std::vector<RecordedStream>*>;
 
   const OrderedMap<Facts> facts;
-
- private:
-  OrderedMap<const std::vector<RecordedStream>*> streams_;
+  Streams streams;  // of each diagnostic; nothing if they were not recorded
+  Streams queues;   // likewise
 };
+
+// Compares what both runs recorded of the diagnostic.
+void compareRecorded(const std::string& name, const ComparedRun::Streams& before, const ComparedRun::Streams& after,
+                     std::vector<Difference>& differences) {
+  const auto* const one = before.find(name);
+  const auto* const other = after.find(name);
+  if (one != nullptr && other != nullptr) compareStreams(name, **one, **other, differences);
+}
 
 }  // namespace
 
@@ -159,9 +174,8 @@ std::vector<Difference> listedDifferences(const RecordedRun& before, const Recor
       continue;
     }
     compare(name, facts, *others, differences);
-    const auto* const streams = first.streamsOf(name);
-    const auto* const otherStreams = second.streamsOf(name);
-    if (streams != nullptr && otherStreams != nullptr) compareStreams(name, *streams, *otherStreams, differences);
+    compareRecorded(name, first.streams, second.streams, differences);
+    compareRecorded(name, first.queues, second.queues, differences);
   }
   for (const auto& [name, facts] : second.facts) {
     if (!first.facts.contains(name)) differences.push_back({name, "", std::nullopt, ""});

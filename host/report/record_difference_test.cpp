@@ -124,6 +124,25 @@ TEST(DifferencesOf, TellTheFirstFrameOfEachStreamThatDiffers) {
                                       "A: stream front is only in the second"}));
 }
 
+TEST(DifferencesOf, TellTheFirstTaskOfEachQueueThatDiffersIfBothRecordsHaveThem) {
+  const auto withTasks = [](std::vector<TracedFrame> tasks, std::uint64_t lost) {
+    RecordedRun run = tracedRun({});
+    run.began.tracesTasks = true;
+    run.queues = {{{"Work", std::move(tasks), lost, {}, TracedKind::kTasks}}};
+    return run;
+  };
+  const RecordedRun run = withTasks({{1, 2, 3, 4}, {1, 5, 6, std::nullopt}}, 0);
+  EXPECT_THAT(differencesOf(run, run), IsEmpty());
+  EXPECT_EQ(
+      differencesOf(run, withTasks({{1, 2, 3, 4}, {2, 5, 6, 7}}, 1)),
+      std::vector<std::string>(
+          {"A: queue Work: task 2, the first that differs, was thread 1, posted at 5 ns, begun at 6 ns, not ended "
+           "and is thread 2, posted at 5 ns, begun at 6 ns, ended at 7 ns",
+           "A: queue Work: the number of lost tasks was 0 and is 1"}));
+  EXPECT_THAT(differencesOf(run, tracedRun({})), IsEmpty());
+  EXPECT_THAT(differencesOf(tracedRun({}), run), IsEmpty());
+}
+
 TEST(DifferencesOf, LeaveOutTheFramesIfOneRecordHasNone) {
   const RecordedRun traced = tracedRun({{"back", {{0, 1, 2, 3}}, 0}});
   const RecordedRun untraced = runWith({recordOf("A", Verdict::kPass)});

@@ -133,7 +133,7 @@ std::optional<Format> otherFormatOfSuffix(const OutputRequest& output) {
 
 std::string reportText(Format format, const RunStarted& run, const std::vector<DiagnosticRecord>& records,
                        const std::optional<std::string>& interrupted, const TextContent& text,
-                       const RunStreams& streams) {
+                       const RunStreams& streams, const RunStreams& queues) {
   switch (format) {
     case Format::kText: return textReport(run, records, interrupted, text);
     case Format::kCsv: {
@@ -147,7 +147,7 @@ std::string reportText(Format format, const RunStarted& run, const std::vector<D
     case Format::kJunit: return junitReport(run, records, interrupted, {text.allowSkips, run.acceptFlaky});
     case Format::kHtml: {
       const std::vector<DiagnosticRecord> all = withInterruptedOfAnalysis(run, records, interrupted);
-      return text.page({run, all, streams, interrupted});
+      return text.page({run, all, streams, interrupted, true, {}, &queues});
     }
     case Format::kTrace: throw std::invalid_argument("a time line is made from events");
     case Format::kJson: break;

@@ -48,7 +48,7 @@ void refuseNoFile(const std::string& text, const OutputRequest& output);
 // The format that the suffix of the file suggests, if the report has another; nothing for other suffixes.
 std::optional<Format> otherFormatOfSuffix(const OutputRequest& output);
 
-// The frames of each record of a run; empty if they are not known.
+// The frames of each record of a run, or the tasks; empty if they are not known.
 using RunStreams = std::vector<std::vector<RecordedStream>>;
 
 // A run as a page shows it. Borrows all but its last members.
@@ -58,7 +58,8 @@ struct ShownRun {
   const RunStreams& streams;
   std::optional<std::string> interrupted{};  // as in RunEnded; without an end, the diagnostic that was running
   bool hasEnded = true;
-  std::string file{};  // of the record; empty: none
+  std::string file{};                  // of the record; empty: none
+  const RunStreams* queues = nullptr;  // null: none
 };
 
 // What the text reports of a run show.
@@ -71,10 +72,11 @@ struct TextContent {
 };
 
 // The complete report of a run in one of kRecordFormats. `interrupted` as in RunEnded. `text` only matters for kText,
-// but `allowSkips` also for kJunit, and `page`, which is then required, for kHtml, as `streams` do.
+// but `allowSkips` also for kJunit, and `page`, which is then required, for kHtml, as `streams` and
+// `queues` do.
 std::string reportText(Format format, const RunStarted& run, const std::vector<DiagnosticRecord>& records,
                        const std::optional<std::string>& interrupted, const TextContent& text = {},
-                       const RunStreams& streams = {});
+                       const RunStreams& streams = {}, const RunStreams& queues = {});
 
 // Prints the text report of one record of the run; nothing if that report only counts it (variation_report.h). `shown`
 // is about the records before.

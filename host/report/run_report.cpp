@@ -78,8 +78,9 @@ void RunReport::onEvent(const RunEvent& event) {
     tell(*heartbeat);
   } else if (const auto* const traced = std::get_if<FramesTraced>(&event)) {
     if (!keepsFrames_) return;
-    streams_.resize(records_.size() + 1);
-    addFrames(streams_.back(), FramesTraced(*traced));
+    RunStreams& streams = traced->kind == TracedKind::kFrames ? streams_ : queues_;
+    streams.resize(records_.size() + 1);
+    addFrames(streams.back(), FramesTraced(*traced));
   } else if (const auto* const ended = std::get_if<RunEnded>(&event)) {
     finishRun(*ended);
   }
@@ -164,7 +165,7 @@ void RunReport::writeReport(const OutputRequest& output, const std::optional<std
     if (output.format == Format::kTrace) {
       write(textOf(*timeline_));
     } else {
-      write(reportText(output.format, run_, records_, interrupted, options_.text, streams_));
+      write(reportText(output.format, run_, records_, interrupted, options_.text, streams_, queues_));
     }
   } catch (const CommandError& problem) {
     console_.err << "quazor: " << printable(problem.what()) << '\n';

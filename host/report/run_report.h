@@ -84,6 +84,7 @@ class RunReport final : public RunEventSink {
   std::vector<DiagnosticRecord> records_;
   const bool keepsFrames_;  // for a page
   RunStreams streams_;
+  RunStreams queues_;
   std::optional<Timeline> timeline_;  // if one is requested
   bool allWritten_ = true;
 };

@@ -171,19 +171,26 @@ class Timeline::Writer {
 
   void take(const FramesTraced& traced) {
     if (!diagnostic_) return;
+    const bool isOfTasks = traced.kind == TracedKind::kTasks;
+    const std::string rows = isOfTasks ? "tasks" : "frames";
+    const std::string name = rows + " of " + traced.stream;
     const auto next = kFirstStreamRow + static_cast<int>(diagnostic_->streams.size());
-    const auto [found, isNew] = diagnostic_->streams.try_emplace(traced.stream, next);
+    const auto [found, isNew] = diagnostic_->streams.try_emplace(name, next);
     const Row row{diagnostic_->process, found->second};
-    if (isNew) addRow(row.process, row.row, "frames of " + traced.stream);
+    if (isNew) addRow(row.process, row.row, name);
     const nanoseconds first =
         traced.frames.empty() ? diagnostic_->latest : seen(nanoseconds(traced.frames[0].delivered));
-    if (std::uint64_t& step = diagnostic_->steps[traced.stream]; step != traced.step) {
+    if (std::uint64_t& step = diagnostic_->steps[name]; step != traced.step) {
       if (step != 0 || traced.step != 1) {
-        addInstant(row, first, "from here, 1 of " + std::to_string(traced.step) + " frames is recorded", "{}");
+        addInstant(row, first, "from here, 1 of " + std::to_string(traced.step) + " " + rows + " is recorded", "{}");
       }
       step = traced.step;
     }
     for (const TracedFrame& frame : traced.frames) {
+      if (isOfTasks) {
+        addTask(row, frame);
+        continue;
+      }
       std::string arguments = "{\"latency\":" + microseconds(nanoseconds(frame.delivered - frame.captured));
       if (frame.returned) {
         arguments += ",\"held\":" + microseconds(nanoseconds(*frame.returned - frame.delivered));
@@ -191,8 +198,17 @@ class Timeline::Writer {
       addInstant(row, seen(nanoseconds(frame.delivered)), "frame " + std::to_string(frame.number), arguments + "}");
     }
     if (traced.lost > 0) {
-      addInstant(row, diagnostic_->latest, std::to_string(traced.lost) + " frames could not be recorded", "{}");
+      addInstant(row, diagnostic_->latest, std::to_string(traced.lost) + " " + rows + " could not be recorded", "{}");
     }
+  }
+
+  void addTask(Row row, const TracedFrame& task) {
+    const nanoseconds begun = seen(nanoseconds(task.delivered));
+    const std::string name = "thread " + std::to_string(task.number);
+    std::string arguments = "{\"waited\":" + microseconds(nanoseconds(task.delivered - task.captured));
+    if (!task.returned) return addInstant(row, begun, name + ", not ended", arguments + "}");
+    arguments += ",\"ran\":" + microseconds(nanoseconds(*task.returned - task.delivered)) + "}";
+    addDuration(row, begun, seen(nanoseconds(*task.returned)), name, arguments);
   }
 
   void take(const Failed& failure) {

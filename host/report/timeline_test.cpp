@@ -68,6 +68,24 @@ std::vector<RunEvent> tracedRun() {
           RunEnded{std::nullopt, momentAt(14)}};
 }
 
+TEST(Timeline, HasARowWithTheTasksOfAQueue) {
+  std::vector<RunEvent> events = tracedRun();
+  events.insert(events.end() - 4,
+                FramesTraced{"wide",
+                             1,
+                             {{3, kSecond, kSecond + 2000, kSecond + 7000}, {4, kSecond, kSecond + 9000, std::nullopt}},
+                             2,
+                             TracedKind::kTasks});
+  const Json line = lineOf(events);
+  const Json task = eventIn(line, "X", "thread 3");
+  expectPeriod(task, 1'007'002, 5);
+  EXPECT_EQ(task["args"], Json::parse(R"({"waited":2.0,"ran":5.0})"));
+  EXPECT_EQ(eventIn(line, "i", "thread 4, not ended")["args"], Json::parse(R"({"waited":9.0})"));
+  EXPECT_EQ(eventsIn(line, "i", "2 tasks could not be recorded").size(), 1U);
+  EXPECT_EQ(eventsIn(line, "i", "frame 7").size(), 1U);  // the stream of the same name has a row of its own
+  EXPECT_NE(eventsIn(line, "i", "frame 7")[0]["tid"], task["tid"]);
+}
+
 TEST(Timeline, HasStagesOneAfterTheOther) {
   const Json line = lineOf(tracedRun());
   expectPeriod(eventIn(line, "X", "load"), 2000, 5000);

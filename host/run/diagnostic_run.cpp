@@ -258,7 +258,9 @@ void runDiagnostic(const Diagnostic& diagnostic, const ResolvedParameters& param
       options.frames->begin(log.log()->begin());
       phone->traceFrames(*options.frames);
     }
-    platform.concurrency = concurrencyOfRun(std::move(platform.concurrency), log.log());
+    TaskTrace tasks;
+    if (options.trace.tasks) tasks = {options.frames, platform.clock, phone->whenTraceIsFull()};
+    platform.concurrency = concurrencyOfRun(std::move(platform.concurrency), log.log(), std::move(tasks));
     installPlatform(platform);
     Run run(diagnostic, parameters, *platform.clock, serial, options.isInterrupted);
     const std::unique_ptr<QZExperimentResult> result = run.experiment();

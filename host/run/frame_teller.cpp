@@ -33,8 +33,8 @@ void FrameTeller::end() {
   if (const std::uint64_t streams = drain_.withoutRing(); streams > 0) {
     events_.onEvent(Logged{{{},
                             LogLevel::kDefault,
-                            formatMessage("the frames of %@ more streams are not recorded: there are more than %@",
-                                          streams, FrameRings::kMaxStreams),
+                            formatMessage("%@ more streams or queues are not recorded: there are more than %@", streams,
+                                          FrameRings::kMaxStreams),
                             dateNow()},
                            true});
   }
@@ -58,6 +58,7 @@ void FrameTeller::tell(std::size_t stream) {
   event.lost = drain_.takeLost(stream);
   if (event.frames.empty() && event.lost == 0) return;
   event.stream = drain_.nameOf(stream);
+  event.kind = drain_.kindOf(stream);
   events_.onEvent(event);
   event.frames.clear();
 }

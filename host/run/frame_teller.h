@@ -1,4 +1,4 @@
-// FrameTeller: tells the frames of a phone as events.
+// FrameTeller: tells the frames of a phone, and the tasks of queues, as events.
 #pragma once
 
 #include "host/device/frame_rings.h"
@@ -10,12 +10,13 @@
 
 namespace quazor {
 
-// What a run records about frames.
+// What a run records about frames and tasks.
 struct TraceSetting {
   static constexpr std::uint64_t kDefaultFrames = 100'000;
 
   bool isOn = false;
   std::uint64_t framesPerStep = kDefaultFrames;  // as in FrameRings
+  bool tasks = false;                            // the tasks of the plug-in's queues, too
 };
 
 // Collects the frames of each stream and tells them when there are kMaxTracedFrames, or every ten seconds.

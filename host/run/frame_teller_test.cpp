@@ -99,7 +99,7 @@ TEST_F(FrameTellerTest, SaysHowManyStreamsAreNotRecorded) {
     rings_->addStream(std::to_string(i), clock_, WhenTraceIsFull::kLose);
   }
   teller_->end();
-  EXPECT_THAT(told(), ElementsAre("the frames of 2 more streams are not recorded: there are more than 64"));
+  EXPECT_THAT(told(), ElementsAre("2 more streams or queues are not recorded: there are more than 64"));
 }
 
 }  // namespace

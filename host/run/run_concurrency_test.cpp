@@ -94,6 +94,33 @@ bool contains(const std::vector<std::string>& texts, const std::string& text) {
   return std::find(texts.begin(), texts.end(), text) != texts.end();
 }
 
+TEST_F(RunConcurrencyTest, TasksThatBeginAreToldInTheirOrder) {
+  const auto clock = std::make_shared<ManualClock>();
+  EventList events;
+  const auto rings = std::make_shared<FrameRings>(0);
+  rings->begin(clock->now());
+  const std::shared_ptr<Concurrency> concurrency =
+      concurrencyOfRun(std::make_shared<KeepingConcurrency>(kept_), std::make_shared<RunLog>(clock, events),
+                       {rings, clock, WhenTraceIsFull::kLose});
+  const auto queue = concurrency->makeSerialQueue("Work", QualityOfService::kDefault);
+  queue->async([&] { clock->sleep(5ns); });
+  clock->sleep(10ns);
+  queue->asyncAfter(20ns, [] {});
+  clock->sleep(100ns);
+  queue->async([] {});  // never begins
+  Task last = std::move(kept_.back());
+  kept_.pop_back();
+  performKept();
+  FrameDrain drain(*rings);
+  std::vector<TracedFrame> told;
+  drain.drain(true, [&](std::size_t, const TracedFrame& task, std::uint64_t) { told.push_back(task); });
+  ASSERT_EQ(told.size(), 2U);
+  EXPECT_EQ(drain.nameOf(0), "Work");
+  EXPECT_EQ(drain.kindOf(0), TracedKind::kTasks);
+  EXPECT_EQ(told[0], (TracedFrame{told[0].number, 0, 110, 115}));
+  EXPECT_EQ(told[1], (TracedFrame{told[0].number, 10, 115, 115}));
+}
+
 TEST_F(RunConcurrencyTest, ALateTaskDoesNotWriteIntoTheLogOfTheNextRun) {
   logOf([] {
     const auto queue = installedPlatform().concurrency->makeSerialQueue("queue", QualityOfService::kDefault);

@@ -87,9 +87,11 @@ void writeRecords(const fs::path& folder) {
   records.add("cut_off", std::string_view(whole).substr(0, whole.size() - 9));
   std::vector<RunEvent> traced = wholeRun();
   std::get<RunStarted>(traced.front()).traced = true;
+  std::get<RunStarted>(traced.front()).tracesTasks = true;
   traced.insert(traced.begin() + 3, {FramesTraced{"front", 1, {{0, 5, 10, 20}, {1, 4, 11, std::nullopt}}, 0},
                                      FramesTraced{"back", 2, {{0, -5, 10, 20}}, 7},
-                                     FramesTraced{"front", 2, {{2, 15, 20, 30}, {4, 16, 21, 31}}, 0}});
+                                     FramesTraced{"front", 2, {{2, 15, 20, 30}, {4, 16, 21, 31}}, 0},
+                                     FramesTraced{"Work", 1, {{1, 5, 10, 20}}, 1, TracedKind::kTasks}});
   records.add("traced", recordText(traced));
   std::vector<RunEvent> interrupted = wholeRun();
   interrupted.back() = RunEnded{"Broken", momentAt(99)};

@@ -9,6 +9,7 @@
 #include "host/report/page/details.h"
 #include "host/report/page/frames_section.h"
 #include "host/report/page/html.h"
+#include "host/report/page/queues_section.h"
 #include "host/report/page/results_table.h"
 #include "host/report/page/run_facts.h"
 #include "host/report/rerun_command.h"
@@ -33,9 +34,13 @@ std::string idOf(std::size_t run, std::size_t record) {
   return "run" + std::to_string(run) + "-" + std::to_string(record + 1);
 }
 
-const std::vector<RecordedStream>& streamsOf(const ShownRun& run, std::size_t index) {
+const std::vector<RecordedStream>& entryOf(const RunStreams& streams, std::size_t index) {
   static const std::vector<RecordedStream> none;
-  return index < run.streams.size() ? run.streams[index] : none;
+  return index < streams.size() ? streams[index] : none;
+}
+
+const std::vector<RecordedStream>& streamsOf(const ShownRun& run, std::size_t index) {
+  return entryOf(run.streams, index);
 }
 
 std::string titleOf(const DiagnosticRecord& record) {
@@ -210,6 +215,9 @@ std::string diagnosticSection(const ShownRun& run, std::size_t number, std::size
   const std::string entry = entryText(run, number, index);
   body += scrolling("Results of " + entry, resultsTable(record));
   if (options.frames) body += framesOf(run, number, index, level + 1, many);
+  if (options.frames && run.queues != nullptr) {
+    body += scrolling("Tasks of " + entry, queuesSection(entryOf(*run.queues, index), level + 1));
+  }
   body += scrolling("Counters and other data of " + entry, auxiliarySection(record, level + 1));
   body += measurementsSection(record, level + 1);
   body += scrolling("Parameters of " + entry, parametersSection(record, level + 1));
