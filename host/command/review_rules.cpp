@@ -19,7 +19,7 @@ namespace quazor {
 
 namespace {
 
-constexpr std::size_t kMaxLetters = 48;      // a table of results has room for it in 80 columns
+constexpr std::size_t kMaxLetters = 48;   // a table of results has room for it in 80 columns
 constexpr std::size_t kMaxSummary = 160;  // two lines of a terminal
 constexpr std::size_t kMaxListed = 5;     // names in one finding
 constexpr std::chrono::milliseconds kMaxTime{500};

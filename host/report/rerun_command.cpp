@@ -78,6 +78,7 @@ std::string commandOf(const Group& group, bool isOnlyOne, const ShownRun& run) {
   if (began.attempts > 0) add(optionPart("--attempts", std::to_string(began.attempts)));
   if (began.repetitions > 0) add(optionPart("--repeat", std::to_string(began.repetitions)));
   if (began.acceptFlaky) add("--accept-flaky");
+  if (began.tracesTasks) add("--trace queues");
   for (const auto& [key, value] : began.tags) add(optionPart("--tag", formatMessage("%@=%@", key, value)));
   std::string command;
   for (const std::string& part : commandParts(began, names, group.front()->seed)) {

@@ -63,6 +63,13 @@ TEST(RerunCommand, HasNoSeedForAMachine) {
   EXPECT_THAT(run.commands(), HasSubstr("--phone linux:board.json \\\n  --profile none"));
 }
 
+TEST(RerunCommand, TracesTheQueuesAgain) {
+  TwoDiagnostics run;
+  EXPECT_THAT(run.commands(), Not(HasSubstr("--trace")));
+  run.began.tracesTasks = true;
+  EXPECT_THAT(run.commands(), HasSubstr("--trace queues\n"));
+}
+
 // A limit that fits no result of a command would be an error of it.
 TEST(RerunCommand, HasTheLimitsThatCountForItsDiagnostics) {
   TwoDiagnostics run;
