@@ -25,19 +25,7 @@ constexpr int kNoCount = 2;
 constexpr int kNotStreaming = 3;
 constexpr int kMissingMeasurement = 6;  // of QZErrorDomain
 
-// Gives the device back on every path: stops its streams and releases their control.
-class InvalidatedAtEnd {
- public:
-  explicit InvalidatedAtEnd(std::shared_ptr<CaptureDevice> device) : device_(std::move(device)) {}
-  InvalidatedAtEnd(const InvalidatedAtEnd&) = delete;
-  InvalidatedAtEnd& operator=(const InvalidatedAtEnd&) = delete;
-  ~InvalidatedAtEnd() { static_cast<void>(device_->invalidate(nullptr)); }
-
- private:
-  const std::shared_ptr<CaptureDevice> device_;
-};
-
-class RailSwitchExperiment final : public QZExperiment {
+class RailSwitchExperiment final : public QZExperiment, public QZTeardown {
  public:
   explicit RailSwitchExperiment(const Platform& platform = installedPlatform())
       : reports_(platform.reports), capture_(platform.capture), clock_(platform.clock) {}
@@ -54,10 +42,8 @@ class RailSwitchExperiment final : public QZExperiment {
     if (before == nullptr) return failReport(error, reason);
 
     const auto plugIn = capture_->createPlugIn();
-    const auto device = plugIn == nullptr ? nullptr : plugIn->device(&reason);
-    if (device == nullptr) return failStream(error, reason);
-    const InvalidatedAtEnd invalidated(device);
-    if (!startFirstCamera(*device, &reason)) return failStream(error, reason);
+    device_ = plugIn == nullptr ? nullptr : plugIn->device(&reason);
+    if (device_ == nullptr || !startFirstCamera(*device_, &reason)) return failStream(error, reason);
     clock_->sleep(std::chrono::seconds(1));
     const auto after = wanted->snapshot(&reason);
     const auto rise = after == nullptr ? nullptr : after->snapshotWithBaseline(*before, &reason);
@@ -70,6 +56,9 @@ class RailSwitchExperiment final : public QZExperiment {
     }
     return result;
   }
+
+  // Also called after a run that failed. Stops the streams of the device and releases their control.
+  bool teardown(DiagnosticErrorPtr* error) override { return device_ == nullptr || device_->invalidate(error); }
 
  private:
   static bool isWanted(const ReportChannelDescription& channel) {
@@ -103,6 +92,7 @@ class RailSwitchExperiment final : public QZExperiment {
   const std::shared_ptr<ReportFacility> reports_;
   const std::shared_ptr<CaptureService> capture_;
   const std::shared_ptr<Clock> clock_;
+  std::shared_ptr<CaptureDevice> device_;  // of the run, until teardown
 };
 
 class RailSwitchAnalysis final : public QZAnalysis {
