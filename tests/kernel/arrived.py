@@ -27,8 +27,9 @@ def expect_equal(what, got, wanted):
 class Arrived:
     """The files of a step. Labels are those that the step's script passed to `run`."""
 
-    def __init__(self, parcel):
+    def __init__(self, parcel, slowness=1):
         self._parcel = parcel
+        self.slowness = slowness  # how many times as long the programs take as those of a release
 
     @property
     def name(self):

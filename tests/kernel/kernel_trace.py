@@ -3,8 +3,12 @@
 import dataclasses
 import re
 
-EVENT = re.compile(r"^ *.+-\d+ +\[\d+\] \S+ +(?P<time>\d+\.\d+): (?:v4l2_dqbuf: minor = (?P<minor>\d+),"
-                   r".* timestamp = (?P<timestamp>\d+),.* sequence = (?P<sequence>\d+)$|sys_write\()", re.MULTILINE)
+MOMENT = r"-\d+ +\[\d+\] \S+ +(?P<time>\d+\.\d+): "
+DEQUEUED = re.compile(r"^ *.+" + MOMENT + r"v4l2_dqbuf: minor = (?P<minor>\d+),.* timestamp = (?P<timestamp>\d+),"
+                      r".* sequence = (?P<sequence>\d+)$", re.MULTILINE)
+
+# The process that runs the diagnostic. Others tell the user meanwhile that it is still running.
+WRITTEN = re.compile(r"^ *quazor-guard" + MOMENT + r"sys_write\(", re.MULTILINE)
 
 
 @dataclasses.dataclass(frozen=True)
@@ -20,15 +24,12 @@ class Dequeued:
 @dataclasses.dataclass(frozen=True)
 class KernelTrace:
     dequeued: list  # of Dequeued
-    writes: list  # times in seconds
+    writes: list  # times in seconds, of the process that runs the diagnostic
 
     def end_of_silence(self):
-        """The first write after the last long time without one, which is at least half of the longest. A program that
-        sleeps while cameras stream writes nothing but that it is still running, every half minute, and writes again
+        """The first write after the longest time without one: a diagnostic sleeps while cameras stream, and writes again
         when it has read the results."""
-        between = list(zip(self.writes, self.writes[1:]))
-        longest = max(later - earlier for earlier, later in between)
-        return [later for earlier, later in between if later - earlier >= longest / 2][-1]
+        return max(zip(self.writes, self.writes[1:]), key=lambda pair: pair[1] - pair[0])[1]
 
     def dequeued_before(self, minor, moment):
         return [buffer for buffer in self.dequeued if buffer.minor == minor and buffer.time < moment]
@@ -41,11 +42,8 @@ def gaps_in(buffers):
 
 def read_trace(text):
     """Parses a trace file of tracefs."""
-    dequeued, writes = [], []
-    for event in EVENT.finditer(text):
-        if event["minor"] is None:
-            writes.append(float(event["time"]))
-        else:
-            numbers = (int(event[name]) for name in ("minor", "timestamp", "sequence"))
-            dequeued.append(Dequeued(float(event["time"]), *numbers))
-    return KernelTrace(dequeued, writes)
+    dequeued = []
+    for event in DEQUEUED.finditer(text):
+        numbers = (int(event[name]) for name in ("minor", "timestamp", "sequence"))
+        dequeued.append(Dequeued(float(event["time"]), *numbers))
+    return KernelTrace(dequeued, [float(event["time"]) for event in WRITTEN.finditer(text)])

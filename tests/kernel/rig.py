@@ -45,6 +45,7 @@ class Plan:
     initramfs: bytes
     memory: int
     seconds: float
+    slowness: float  # how many times as long its programs take as those of a release
     failed: list = dataclasses.field(default_factory=list)
 
 
@@ -90,7 +91,7 @@ def run_plan(plan, kernel, results):
         if step is None:
             ended.append(parcel.name)
             return
-        arrived = Arrived(parcel)
+        arrived = Arrived(parcel, plan.slowness)
         keep(arrived, directory)
         problem = judge(step, arrived)
         verdict = "FAIL" if problem else "pass"
@@ -122,7 +123,7 @@ def plans_of(steps, label, archives, memory, slowness):
         chosen = [step for step in steps if step.boot == number]
         slowed = [dataclasses.replace(step, limit=step.limit * slowness) for step in chosen]
         initramfs = b"".join(archives) + plan_archive(slowed)
-        plans.append(Plan(f"{label}-{number}", chosen, initramfs, memory, BOOT_SECONDS * slowness))
+        plans.append(Plan(f"{label}-{number}", chosen, initramfs, memory, BOOT_SECONDS * slowness, slowness))
     return plans
 
 

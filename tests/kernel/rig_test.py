@@ -41,7 +41,7 @@ class RigTest(unittest.TestCase):
         """Runs a plan on a machine that sends `content`; returns the output and the failed steps."""
         source = self.results / "content"
         source.write_bytes(content)
-        plan = rig.Plan("boot-1", [Step(name, "something", check) for name in steps], b"", 1, seconds)
+        plan = rig.Plan("boot-1", [Step(name, "something", check) for name in steps], b"", 1, seconds, 1)
 
         def command(_kernel, _initramfs, _memory, target):
             return ["sh", "-c", f"cat {shlex.quote(str(source))} >>{shlex.quote(str(target))}; {after}"]
