@@ -20,7 +20,9 @@ inline constexpr std::string_view FrontFacingInfraredCamera = "FrontFacingInfrar
 namespace capture_key {
 
 // Of streams.
-inline constexpr std::string_view PortType = "PortType";                                          // string; read only
+inline constexpr std::string_view PortType = "PortType";  // string; read only
+// string: what the system calls the camera, for people; read only. Perhaps only with control of the stream.
+inline constexpr std::string_view CameraName = "CameraName";
 inline constexpr std::string_view FormatIndex = "FormatIndex";                                    // integer
 inline constexpr std::string_view MinimumFrameRate = "MinimumFrameRate";                          // number, per second
 inline constexpr std::string_view MaximumFrameRate = "MaximumFrameRate";                          // number, per second

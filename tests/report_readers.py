@@ -420,7 +420,13 @@ class Lines:
 def read_text(lines, expected):
     """The next record in a text."""
     record = {"name": lines.next().decode("utf-8", "replace")}
-    record["summary"] = [line.decode("utf-8", "replace") for line in lines.block()]
+    head = [line.decode("utf-8", "replace") for line in lines.block()]
+    record["summary"], said = head[:len(expected["summary"])], head[len(expected["summary"]):]
+    record["said"] = "".join(said).replace(" ", "")  # its lines are broken at blanks
+    beginning = blurred(re.sub(r"(\\x?[0-9a-f]?)?\.\.\.$", "", record["said"]))
+    is_cut = record["said"].endswith("...") and len(record["said"]) > 100  # it is too long
+    if is_cut and blurred(expected["said"]).startswith(beginning):
+        record["said"] = expected["said"]
     record["results"], record["measurements"] = [], []
     if expected["results"]:
         record["results"] = [Result(name, value, unit, text_limit(limit), verdict.replace("-", "none"),
@@ -447,6 +453,8 @@ def expected_of_text(record, of_experiments):
     return {
         "name": printable(record["name"]),
         "summary": ["  " + printable(line) for line in record["summary"].split("\n")],
+        "said": "".join(printable(f"{name}: {value}") for name, value in record["auxiliaryData"].items()
+                        if isinstance(value, str) and not of_experiments).replace(" ", ""),
         "results": [one._replace(name=shown(one.name), unit=shown(one.unit), limit=of_limit(one.limit))
                     for one in report_limits.rows_of(record, lambda label, *_: Limit(label, None, None))],
         "measurements": [(shown(name), value, shown(unit)) for name, value, unit in record["measurements"]]

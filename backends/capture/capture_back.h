@@ -64,6 +64,8 @@ class CameraBack {
   virtual ~CameraBack();
 
   virtual const CameraInfo& info() const = 0;
+  // What the system calls the camera; nothing if that is known only while it is open.
+  virtual std::optional<std::string> cameraName() const = 0;
 
   // Called when a user takes control of the stream: prepares the camera. The settings are new; the back may change them
   // to the values that the camera has. On failure nothing may stay open.

@@ -62,6 +62,12 @@ std::optional<Value> ClientStream::read(std::string_view key, const Refuser& ref
   if (!checkKnown(CaptureObjectKind::kStream, name(), key, refuse)) return std::nullopt;
   CameraSlot& camera = slot();
   if (key == capture_key::PortType) return Value(camera.info().port);
+  if (key == capture_key::CameraName) {
+    const std::optional<std::string> cameraName = camera.back->cameraName();
+    if (cameraName) return Value(*cameraName);
+    refuse(CaptureRefusal::kUnreadableProperty, "%@: %@ cannot be read without control of the stream.", name(), key);
+    return std::nullopt;
+  }
   if (key == capture_key::MinimumFrameRate) {
     const CameraSettings& settings = camera.settings;
     return readRate(key, settings.minimumRate ? settings.minimumRate : settings.maximumRate, refuse);

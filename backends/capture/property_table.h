@@ -30,6 +30,7 @@ inline constexpr std::array kGroupProperties{
 };
 inline constexpr std::array kStreamProperties{
     CaptureProperty{capture_key::PortType, true},
+    CaptureProperty{capture_key::CameraName, true},
     CaptureProperty{capture_key::FormatIndex, false},
     CaptureProperty{capture_key::MinimumFrameRate, false},
     CaptureProperty{capture_key::MaximumFrameRate, false},

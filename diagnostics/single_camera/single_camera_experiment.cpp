@@ -1,5 +1,7 @@
 #include "diagnostics/single_camera/single_camera_experiment.h"
 
+#include "contract/log_channel.h"
+#include "contract/message_format.h"
 #include "diagnostics/single_camera/frame_times.h"
 #include "diagnostics/single_camera/single_camera_names.h"
 #include "platform/capture_keys.h"
@@ -147,6 +149,8 @@ bool QZSingleCameraExperiment::setupWithParameters(const Dictionary& parameters,
 
 std::unique_ptr<QZExperimentResult> QZSingleCameraExperiment::run(DiagnosticErrorPtr* error) {
   if (!openStream(error)) return nullptr;
+  cameraText_ = cameraText();
+  logDefault("Streaming camera %@.", cameraText_);
   const auto recorder = std::make_shared<FrameRecorder>(platform_.clock);
   if (!configureStream(recorder, error)) return nullptr;
   return stream(*recorder, error);
@@ -172,6 +176,17 @@ bool QZSingleCameraExperiment::openStream(DiagnosticErrorPtr* error) {
   fail(error, SingleCameraErrorDomain, single_camera_error::kControlRefused, reason,
        "The camera cannot be controlled.");
   return false;
+}
+
+// A machine may have several cameras, and a verdict means nothing to people who do not know of which. What cannot be
+// read is left out: the camera may be in order nevertheless.
+std::string QZSingleCameraExperiment::cameraText() const {
+  std::string text = formatMessage("%@", camera_);
+  for (const std::string_view key : {capture_key::PortType, capture_key::CameraName}) {
+    const std::optional<Value> value = stream_->valueForProperty(key, nullptr);
+    if (value && value->string() != nullptr) text += ", " + *value->string();
+  }
+  return text;
 }
 
 bool QZSingleCameraExperiment::configureStream(const std::shared_ptr<FrameRecorder>& recorder,
@@ -228,6 +243,7 @@ std::unique_ptr<QZExperimentResult> QZSingleCameraExperiment::stream(FrameRecord
     measurements.set(std::string(single_camera::kErrorsPrefix) + name,
                      Measurement(grown, QZDimensionlessUnit::errors()));
   }
+  result->auxiliaryData().set(single_camera::kCamera, cameraText_);
   return result;
 }
 

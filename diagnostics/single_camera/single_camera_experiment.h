@@ -28,7 +28,8 @@ inline constexpr std::int64_t kNoErrorCounters = 7;
 class FrameRecorder;
 
 // The result contains the measurements of single_camera_names.h: what the frames' time stamps say, how long the camera
-// was silent at both ends of the stream, and by how much each of the stream's error counters grew.
+// was silent at both ends of the stream, and by how much each of the stream's error counters grew. Its auxiliary data
+// says which camera it was.
 // Thread: the host's, as QZExperiment; frames arrive on threads of the capture service.
 class QZSingleCameraExperiment final : public QZExperiment, public QZTeardown, public QZParameterRanges {
  public:
@@ -47,6 +48,8 @@ class QZSingleCameraExperiment final : public QZExperiment, public QZTeardown, p
 
  private:
   bool openStream(DiagnosticErrorPtr* error);
+  // The position, the port and the name of the camera, for people.
+  std::string cameraText() const;
   bool configureStream(const std::shared_ptr<FrameRecorder>& recorder, DiagnosticErrorPtr* error);
   std::optional<Value> errorCounters(DiagnosticErrorPtr* error);
   std::unique_ptr<QZExperimentResult> stream(FrameRecorder& recorder, DiagnosticErrorPtr* error);
@@ -56,6 +59,7 @@ class QZSingleCameraExperiment final : public QZExperiment, public QZTeardown, p
   double frameRate_ = 30;  // per second
   std::uint64_t camera_ = 0;
   std::uint64_t formatIndex_ = 0;
+  std::string cameraText_;
   std::shared_ptr<CaptureDevice> device_;
   std::shared_ptr<CaptureStream> stream_;
 };

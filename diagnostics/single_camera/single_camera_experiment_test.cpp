@@ -99,6 +99,21 @@ TEST_F(SingleCameraExperimentTest, StreamsTheCameraAtThePosition) {
   EXPECT_EQ(measured(kFrames, {{"camera", 2}}), 90);
 }
 
+TEST_F(SingleCameraExperimentTest, SaysWhichCameraItWas) {
+  const auto said = [this](const Dictionary& parameters) {
+    const auto result = run(parameters);
+    const Value* const text = result == nullptr ? nullptr : result->auxiliaryData().find(kCamera);
+    return text == nullptr ? "nothing" : defaultText(*text);
+  };
+  EXPECT_EQ(said({}), "0, BackFacingCamera, back-wide");
+  EXPECT_EQ(said({{"camera", 3}}), "3, FrontFacingCamera, front");
+  // It is judged nevertheless.
+  scenario.faults = {failing("CaptureStream.valueForProperty", "CameraName")};
+  EXPECT_EQ(said({}), "0, BackFacingCamera");
+  scenario.faults = {failing("CaptureStream.valueForProperty", "PortType")};
+  EXPECT_EQ(said({}), "0, back-wide");
+}
+
 TEST_F(SingleCameraExperimentTest, MeasuresARateOfTheCamerasOwn) {
   camera().actualFrameRate = 20;
   EXPECT_NEAR(measured(kFrameRate), 20, 1e-6);

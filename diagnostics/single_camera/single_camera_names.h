@@ -17,6 +17,8 @@ inline constexpr std::string_view kBackwardTimeStamps = "BackwardTimeStamps";
 inline constexpr std::string_view kJitter = "Jitter";
 inline constexpr std::string_view kSilenceAtStart = "SilenceAtStart";
 inline constexpr std::string_view kSilenceAtEnd = "SilenceAtEnd";
+// Of the auxiliary data: which camera was streamed.
+inline constexpr std::string_view kCamera = "Camera";
 // Followed by the name of one of the stream's error counters.
 inline constexpr std::string_view kErrorsPrefix = "Errors.";
 

@@ -1,9 +1,11 @@
 #include "host/command/conductor.h"
 
+#include "host/model/limit_check.h"
 #include "host/model/trials.h"
 #include "host/run/traced_run.h"
 #include "host/text/timestamp.h"
 
+#include <algorithm>
 #include <chrono>
 #include <thread>
 #include <utility>
@@ -19,19 +21,34 @@ std::optional<std::string> Conductor::performAll(const std::vector<Job>& jobs, c
 
 std::optional<std::string> Conductor::performRound(const std::vector<Job>& jobs, const Plan& plan,
                                                    std::uint64_t repetition) {
-  for (const Job& one : jobs) {
+  for (std::size_t i = 0; i < jobs.size(); ++i) {
+    const Job& one = jobs[i];
     Job job = one;
     if (plan.repetitions > 1) job.repetition = repetition;
     if (plan.attempts > 1) job.attempt = 1;
     if (stopped_ || job.skip) {
       job.seed = seedOf(one.seed, job.repetition, 1);
       skip(job, stopped_ ? *stopped_ : *job.skip);
-      continue;
+    } else {
+      if (std::optional<std::string> interrupted = performAttempts(std::move(job), plan)) return interrupted;
+      stopped_ = stopAfterLast(plan.stopOn);
     }
-    if (std::optional<std::string> interrupted = performAttempts(std::move(job), plan)) return interrupted;
-    stopped_ = stopAfterLast(plan.stopOn);
+    if (repetition == 1 && !stopped_) tellMissedLimits(jobs, i, plan);
   }
   return std::nullopt;
+}
+
+void Conductor::tellMissedLimits(const std::vector<Job>& jobs, std::size_t ended, const Plan& plan) const {
+  const bool isLastJob = ended + 1 == jobs.size();
+  if (isLastJob && plan.repetitions == 1) return;  // the report tells it at once
+  for (const UserLimit& limit : plan.limits) {
+    const auto isMeant = [&limit](const Job& job) { return appliesTo(limit, job.bound.described.diagnostic.name); };
+    const auto next = jobs.begin() + static_cast<std::ptrdiff_t>(ended);
+    if (!isMeant(*next) || std::any_of(next + 1, jobs.end(), isMeant)) continue;
+    if (limitsWithoutResult({limit}, events_.records()).empty()) continue;
+    const DiagnosticErrorPtr error = errorOfLimitWithoutResult(limit, events_.records());
+    events_.tellRemark((plan.repetitions > 1 ? "so far, " : "") + error->localizedDescription());
+  }
 }
 
 std::optional<std::string> Conductor::performAttempts(Job job, const Plan& plan) {

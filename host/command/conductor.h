@@ -2,6 +2,7 @@
 #pragma once
 
 #include "host/cli/choice_options.h"
+#include "host/limits/user_limit.h"
 #include "host/plugin/parameters.h"
 #include "host/run/diagnostic_run.h"
 #include "host/run/event_pipeline.h"
@@ -34,6 +35,7 @@ struct Plan {
   std::uint64_t attempts = 1;         // of a job that ends in an error, at most
   std::uint64_t repetitions = 1;      // of all jobs, one round after the other
   SeededPhoneMaker phones{};          // of the attempts; empty: all use the phone of the run
+  std::vector<UserLimit> limits{};    // that are told as soon as all their diagnostics ended without a result for them
 };
 
 // Performs jobs in order, each in a separate process or all in this one.
@@ -56,6 +58,8 @@ class Conductor {
   void performHere(const Job& job);
   void begin(const Job& job);
   void skip(const Job& job, const Skip& skip);
+  // Tells the limits that fit no result, if the job at `ended` is the last one for which they are meant.
+  void tellMissedLimits(const std::vector<Job>& jobs, std::size_t ended, const Plan& plan) const;
   // Waits before every job but the first.
   void settleBefore(const Plan& plan);
   // Waits, or until the user interrupts.

@@ -333,6 +333,22 @@ std::vector<Explanation> readExplanations(const std::vector<std::filesystem::pat
   return all;
 }
 
+std::vector<Explanation> explanationsIfReadable(const std::vector<std::filesystem::path>& directories) {
+  try {
+    return readExplanations(directories);
+  } catch (const InputError&) {
+    return {};
+  }
+}
+
+std::vector<std::string> explainedResults(const std::vector<Explanation>& explanations, const std::string& diagnostic) {
+  std::vector<std::string> results;
+  for (const Explanation& one : explanations) {
+    if (holds(one.from, diagnostic)) results.insert(results.end(), one.names.begin(), one.names.end());
+  }
+  return results;
+}
+
 void addExplainedRanges(const std::vector<std::filesystem::path>& directories,
                         std::vector<DescribedDiagnostic>& diagnostics) {
   const std::vector<Explanation> explanations = explanationsIn(explanationFiles(directories), mayHaveParameters);
@@ -375,13 +391,7 @@ std::function<const Explanation*(const std::string& topic)> explanationFinder(
     std::vector<std::filesystem::path> directories) {
   return [directories = std::move(directories), all = std::make_shared<std::optional<std::vector<Explanation>>>()](
              const std::string& topic) -> const Explanation* {
-    if (!*all) {
-      try {
-        *all = readExplanations(directories);
-      } catch (const InputError&) {
-        all->emplace();
-      }
-    }
+    if (!*all) *all = explanationsIfReadable(directories);
     const auto found = std::ranges::find_if(**all, [&topic](const Explanation& one) {
       return one.isError() ? keyOf(one.domain, one.code) == topic : holds(one.names, topic);
     });

@@ -64,6 +64,9 @@ std::vector<std::filesystem::path> explanationFiles(const std::vector<std::files
 // or two explain the same thing.
 std::vector<Explanation> readExplanations(const std::vector<std::filesystem::path>& directories);
 
+// The same, but nothing if they cannot be read.
+std::vector<Explanation> explanationsIfReadable(const std::vector<std::filesystem::path>& directories);
+
 // Gives the described parameters for which the plug-in gives no range that of the explanations, if there is one. Reads
 // only files that contain parameters, so that a mistake in another does not stop a run; nothing if there are none.
 // Throws InputError like readExplanations(), or if an explanation names a parameter that the experiment or analysis
@@ -76,6 +79,9 @@ void addExplainedRanges(const std::vector<std::filesystem::path>& directories,
 // name, if it selects none.
 std::vector<const Explanation*> findExplanations(const std::vector<Explanation>& explanations,
                                                  const std::string& asked);
+
+// The names that the explanations list as results of the diagnostic, those of measurements and auxiliary data included.
+std::vector<std::string> explainedResults(const std::vector<Explanation>& explanations, const std::string& diagnostic);
 
 // A function that finds the explanation of an error, as DOMAIN:CODE, or of a name in the directories, which are read at
 // the first call; null if there is none, or if they cannot be read. What it returns is valid as long as the function or

@@ -2,9 +2,10 @@
 
 import json
 import pathlib
+import subprocess
 import unittest
 
-from command_line_fixture import PLUGINS, CommandLineTest, WORKING, events_in, quazor
+from command_line_fixture import PLUGINS, CommandLineTest, WORKING, events_in, quazor, start
 
 
 class LimitsTest(CommandLineTest):
@@ -38,7 +39,7 @@ class LimitsTest(CommandLineTest):
                 self.assertEqual(found[2][0]["userLimits"][0]["source"], "command line")
 
     def test_a_limit_without_a_result_is_an_error(self):
-        for limit in (f"{self.name}x > 0", f"Fake.Two:{self.name} > 0"):
+        for limit in (f"{self.name}x > 0", f"Fake.*:{self.name}x > 0"):
             with self.subTest(limit=limit):
                 record = self.directory / "record.jsonl"
                 done = self.run_limited("--limit", limit, "--record", record, "--replace")
@@ -46,17 +47,77 @@ class LimitsTest(CommandLineTest):
                 self.assertIn(f"code 14: the limit '{limit}' (command line) was compared with nothing", done.stdout)
                 self.assertEqual(quazor("verify", record).returncode, 0)
 
-    def test_a_limit_for_an_unknown_diagnostic_suggests_its_name(self):
+    def test_a_limit_for_a_diagnostic_that_was_not_selected_is_refused_before_anything_runs(self):
+        record = self.directory / "record.jsonl"
         for name, suggestion in (("Nowhere", ""), ("Fake.Oen", "; did you mean 'Fake.One'?"), ("Nowhere.*", ""),
-                                 ("Fake", "; did you mean 'Fake.One'?")):
+                                 ("Fake", "; did you mean 'Fake.One'?"), ("Fake.Two", "")):
             with self.subTest(name=name):
-                done = self.run_limited("--limit", f"{name}:A > 0")
-                self.assertEqual(done.returncode, 2, done.stderr)
-                self.assertIn(f"no diagnostic was selected that has the name '{name}'{suggestion}\n", done.stdout)
+                done = self.run_limited("--limit", f"{name}:A > 0", "--record", record)
+                self.assert_refused(done, 64, f"--limit '{name}:A > 0': no diagnostic was selected that has the name "
+                                              f"'{name}'{suggestion}\n")
+                self.assertFalse(record.exists())
+        # One that a folder of plug-ins may have, but a plug-in there cannot be loaded, is not.
+        folder = self.directory / "plugins"
+        folder.mkdir()
+        (folder / "broken.so").write_text("no plug-in")
+        done = quazor("run", "--all", "--except", "T*", "--limit", "Broken:A > 0", env={"QUAZOR_PLUGIN_PATH": str(folder)})
+        self.assertEqual(done.returncode, 2, done.stderr)
+        self.assertIn("no diagnostic was selected that has the name 'Broken'", done.stdout)
 
-    def test_a_limit_for_a_diagnostic_that_was_not_selected_says_so(self):
-        done = self.run_limited("--limit", "Fake.Two:A > 0")
-        self.assertIn("no diagnostic was selected that has the name 'Fake.Two'", done.stdout)
+    def test_a_result_that_the_explanations_do_not_name_is_told_before_anything_runs(self):
+        back = "CameraSyncDiagnostic.Back"
+        told = "quazor: the limit '{}' (command line) may be compared with nothing: the explanations name no result {}\n"
+        for limit, rest in ((f"{back}:BackTele.Totl >= 1", f"'BackTele.Totl' of {back}; did you mean 'BackTele.Total'?"),
+                            ("*.Totals >= 1", "'*.Totals' of the selected diagnostics; did you mean '*.Total'?"),
+                            ("Zebra >= 1", "'Zebra' of the selected diagnostics"),
+                            ("BackTele.Total == BackWide.Totl",
+                             "'BackWide.Totl' of the selected diagnostics; did you mean 'BackWide.Total'?")):
+            with self.subTest(limit=limit):
+                with start("run", back, "--limit", limit, stderr=subprocess.STDOUT) as process:
+                    output = process.communicate()[0]
+                self.assertEqual(process.returncode, 2, output)
+                self.assertTrue(output.startswith(told.format(limit, rest) + "Run "), output)
+                self.assertEqual(output.count("may be compared"), 1, output)
+
+    def test_nothing_is_told_before_of_results_that_may_be_there(self):
+        known = ["--limit", "BackTele.Total == BackWide.Total +- 90", "--limit", "*.Fr* >= 0"]
+        self.assertEqual(quazor("run", "CameraSyncDiagnostic.Back", *known).stderr, "")
+        for names in (("Fake.One",), ("Fake.One", "CameraSyncDiagnostic.Back")):  # no result of it is explained
+            done = self.run_fake("--plugin", "camera_sensor_diagnostics", "--limit", "Nothing > 0", names=names)
+            self.assertNotIn("may be compared", done.stderr)
+        # Also not of what does not run, nor if the explanations cannot be read.
+        back, front = "CameraSyncDiagnostic.Back", "CameraSyncDiagnostic.Front"
+        done = quazor("run", back, front, "--skip", f"{front}=later", "--limit", f"{front}:Zebra > 0")
+        self.assertNotIn("may be compared", done.stderr)
+        explanations = self.directory / "quazor" / "explanations"
+        explanations.mkdir(parents=True)
+        (explanations / "mine.json").write_text("{")
+        done = quazor("run", back, "--limit", "Zebra > 0", env={"XDG_DATA_HOME": str(self.directory)})
+        self.assertEqual((done.returncode, done.stderr), (2, ""))
+
+    def test_a_limit_that_fitted_nothing_is_told_when_its_diagnostic_has_ended(self):
+        back, front = "CameraSyncDiagnostic.Back", "CameraSyncDiagnostic.Front"
+        limit = f"{back}:Front.Total > 0"
+        told = f"the limit '{limit}' (command line) was compared with nothing: no result has the name 'Front.Total'"
+
+        def output_of(*arguments):
+            with start("run", *arguments, stderr=subprocess.STDOUT) as process:
+                return process.communicate()[0]
+
+        output = output_of(back, front, "--limit", limit)
+        parts = output.split(f"quazor: {told}")
+        self.assertEqual(len(parts), 2, output)
+        self.assertIn(f"PASS  {back}", parts[0])
+        self.assertNotIn(f"PASS  {front}", parts[0])
+        self.assertIn(told, parts[1])  # and in the report
+        # At the end the report alone tells it; so it does if the diagnostic ended in an error, or another may fit.
+        self.assertNotIn("quazor: ", output_of(back, "--limit", limit))
+        self.assertNotIn("quazor: ", output_of(back, front, "--limit", "Front.Total > 0"))
+        self.assertNotIn("quazor: the", output_of(back, front, "--limit", limit, "--phone", "camera_sync/port_missing_in_group"))
+        # Of a run with repetitions, the first one tells it.
+        output = output_of(back, "--repeat", 3, "--limit", limit)
+        self.assertEqual(output.count(f"quazor: so far, {told}"), 1, output)
+        self.assertLess(output.index("so far"), output.index("Repetition 1"), output)
 
     def test_what_is_not_a_limit_is_refused_before_anything_runs(self):
         record = self.directory / "record.jsonl"
@@ -197,7 +258,8 @@ class LimitsTest(CommandLineTest):
         self.assertEqual(quazor("analyze", record, "--limit", limit).returncode, 2)
         quazor("run", back, front, "--skip", f"{back}=no room", "--limit", limit, "--record", record, "--replace")
         self.assertEqual(quazor("analyze", record).returncode, 2)
-        quazor("run", front, "--limit", "TesselFaultDiagnostic:A > 0", "--record", record, "--replace")
+        quazor("run", front, "--limit", f"{front}:Front.Total > 0", "--record", record, "--replace")
+        record.write_text(record.read_text().replace(f"{front}:Front.Total", "TesselFaultDiagnostic:A"))
         self.assertEqual(quazor("analyze", record).returncode, 2)
 
     def test_an_entry_that_was_removed_is_missed(self):

@@ -6,6 +6,7 @@
 #include "host/command/conductor.h"
 #include "host/command/explanations.h"
 #include "host/command/failed_only.h"
+#include "host/command/limit_notes.h"
 #include "host/command/output_check.h"
 #include "host/command/records/records_command.h"
 #include "host/command/report_command.h"
@@ -159,7 +160,10 @@ ExitCode perform(const Options& options, const Installation& installation, Conso
     return ExitCode::kInterrupted;
   }
   const Choice& choice = options.choice;
-  const Plan plan{choice.stopOn, realSettleOf(options), choice.attempts, choice.repetitions, phones};
+  const bool mayTakeLong = options.command == Command::kRun;
+  const Plan plan{choice.stopOn,   realSettleOf(options),
+                  choice.attempts, choice.repetitions,
+                  phones,          mayTakeLong ? limits : std::vector<UserLimit>()};
   if (std::optional<std::string> interrupted = conductor.performAll(jobs, plan)) {
     events.onEvent(RunEnded{std::move(interrupted), dateNow()});
     return ExitCode::kInterrupted;
@@ -200,6 +204,21 @@ void refuseUnusedSkips(const std::vector<SkipRule>& rules, const Selection& sele
         [&rule](const ResolvedDiagnostic& one) { return matchesName(rule.pattern, one.described.diagnostic.name); });
     if (fits || !selection.failed.empty()) continue;
     throw CommandError(ExitCode::kUsage, "--skip '" + rule.pattern + "' fits nothing of what is selected to run");
+  }
+}
+
+// Refuses or tells the limits that will probably be compared with nothing.
+void checkLimits(const std::vector<UserLimit>& limits, const std::vector<Job>& jobs, bool areAllLoaded,
+                 const Installation& installation, std::ostream& err) {
+  std::vector<std::string> selected;
+  std::vector<std::string> toRun;
+  for (const Job& job : jobs) {
+    selected.push_back(job.bound.described.diagnostic.name);
+    if (!job.skip) toRun.push_back(selected.back());
+  }
+  if (areAllLoaded) refuseLimitsOfUnselected(limits, selected);
+  for (const std::string& one : limitsOnUnexplained(limits, toRun, installation.explanations())) {
+    err << "quazor: " << printable(one) << '\n';
   }
 }
 
@@ -279,6 +298,7 @@ ExitCode runCommand(const Options& given, const Installation& installation, Cons
     const std::uint64_t seed = own == options.seedOf.end() ? options.seed : own->second;
     jobs.push_back({std::move(one), nullptr, seed, std::move(skip), std::move(problem)});
   }
+  checkLimits(selection.limits, jobs, selection.failed.empty(), installation, console.err);
   RunOptions runOptions;
   runOptions.logLevel = options.logLevel.value_or(LogLevel::kDefault);
   runOptions.logLimit = options.logLimit;

@@ -9,11 +9,14 @@ DROPPED = "camera_sync/frames_dropped"
 
 
 class ShortReportTest(RecordTest):
-    def test_a_diagnostic_that_passes_is_one_line(self):
+    def test_a_diagnostic_that_passes_is_one_line_with_what_it_says_in_words(self):
         result = quazor("run", "--all")
         self.assertEqual(result.returncode, 0, result.stderr)
         *verdicts, counts = without_run(result.stdout).splitlines()
         self.assertEqual(counts, "5 diagnostics: 5 passed, 0 failed, 0 ended in an error")
+        said = verdicts.index("  Camera: 0, BackFacingCamera, back-wide")
+        self.assertTrue(verdicts[said - 1].startswith("PASS  SingleCameraDiagnostic "), verdicts)
+        del verdicts[said]
         self.assertEqual(sorted(line.split()[:2] for line in verdicts),
                          [["PASS", "CameraSyncDiagnostic.Back"], ["PASS", "CameraSyncDiagnostic.Front"],
                           ["PASS", "SingleCameraDiagnostic"], ["PASS", "TesselFaultDiagnostic"],

@@ -273,7 +273,13 @@ std::optional<std::string> patternNear(const std::vector<std::string>& parts, co
   return matchesName(near, name) ? std::optional(near) : std::nullopt;
 }
 
-// Suggests a result or, for a pattern or a last part alone such as "Totals", a pattern that fits several.
+}  // namespace
+
+std::string unselectedText(const UserLimit& limit, const std::vector<std::string>& diagnostics) {
+  return "no diagnostic was selected that has the name '" + limit.diagnostic + "'" +
+         didYouMeanOrPattern(limit.diagnostic, diagnostics);
+}
+
 std::string didYouMeanResult(const std::string& asked, const std::vector<std::string>& names) {
   if (!isPattern(asked) && nearestName(asked, names)) return didYouMean(asked, names);
   const bool isLastPart = !isPattern(asked) && asked.find('.') == std::string::npos;
@@ -288,8 +294,6 @@ std::string didYouMeanResult(const std::string& asked, const std::vector<std::st
   return nearest == near.end() ? std::string() : "; did you mean '" + *nearest + "'?";
 }
 
-}  // namespace
-
 DiagnosticErrorPtr errorOfLimitWithoutResult(const UserLimit& limit, const std::vector<DiagnosticRecord>& records) {
   std::vector<std::string> names;
   std::vector<std::string> diagnostics;
@@ -302,8 +306,7 @@ DiagnosticErrorPtr errorOfLimitWithoutResult(const UserLimit& limit, const std::
   }
   const bool isMeant = std::any_of(diagnostics.begin(), diagnostics.end(),
                                    [&limit](const std::string& name) { return appliesTo(limit, name); });
-  std::string why = !isMeant ? "no diagnostic was selected that has the name '" + limit.diagnostic + "'" +
-                                   didYouMeanOrPattern(limit.diagnostic, diagnostics)
+  std::string why = !isMeant ? unselectedText(limit, diagnostics)
                     : isOnlyForSkipped
                         ? std::string("every diagnostic for which it is meant was skipped")
                         : "no result has the name '" + limit.result + "'" + didYouMeanResult(limit.result, names);

@@ -79,6 +79,13 @@ std::vector<UserLimit> limitsWithoutResult(const std::vector<UserLimit>& limits,
 // True for the entry that reports a limit without a result: it is no diagnostic.
 bool isOfLimit(const DiagnosticRecord& record);
 
+// Why a limit for none of the diagnostics protects nothing, with the nearest of their names.
+std::string unselectedText(const UserLimit& limit, const std::vector<std::string>& diagnostics);
+
+// "; did you mean 'NAME'?" with the nearest result or, for a pattern or a last part alone such as "Totals", a pattern
+// that fits several. Empty if none is near.
+std::string didYouMeanResult(const std::string& asked, const std::vector<std::string>& names);
+
 // The error of a limit without a result, with the reason.
 DiagnosticErrorPtr errorOfLimitWithoutResult(const UserLimit& limit, const std::vector<DiagnosticRecord>& records);
 

@@ -137,6 +137,12 @@ void RunReport::tellInterrupt(Stage stage, std::chrono::nanoseconds grace) {
   });
 }
 
+// The run does not wait for the reader of a remark, which the report repeats.
+void RunReport::tellRemark(const std::string& remark) {
+  if (console_.takesText && !console_.takesText()) return;
+  progress_.printAbove([&] { console_.err << "quazor: " << printable(remark) << '\n' << std::flush; });
+}
+
 void RunReport::finishRun(const RunEnded& event) {
   progress_.stop();
   endRepetition();

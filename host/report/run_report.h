@@ -59,6 +59,9 @@ class RunReport final : public RunEventSink {
   // Tells the user that the running diagnostic is interrupted in that stage, and how long that may take.
   void tellInterrupt(Stage stage, std::chrono::nanoseconds grace);
 
+  // Tells the user something about the run that goes on.
+  void tellRemark(const std::string& remark);
+
   // The records so far.
   const std::vector<DiagnosticRecord>& records() const { return records_; }
   // The exit code after the end of the run; kCannotWrite if a report could not be written.

@@ -200,6 +200,7 @@ void printShortRecord(std::ostream& out, const DiagnosticRecord& record, bool co
   prepareFor(out, table);
   printResults(table, record, ResultRows::kNoteworthy, colour);
   if (!passed) out << indentedLines(record.summary, "  ");
+  printAuxiliaryTexts(out, record);
   if (record.verdict == Verdict::kError) out << '\n' << errorText(record.error, "  ");
   if (!table.view().empty()) out << (passed ? "" : "\n") << table.str();
   if (!passed || !table.view().empty()) out << '\n';

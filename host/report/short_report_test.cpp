@@ -51,6 +51,20 @@ TEST(PrintShortRecord, IsOneLineForADiagnosticThatPasses) {
   EXPECT_EQ(shortText(recordOf("A", Verdict::kPass), 4), "PASS  A     2 results, 1 with a limit\n");
 }
 
+TEST(PrintShortRecord, ShowsTheTextsOfTheAuxiliaryData) {
+  DiagnosticRecord record = recordOf("A", Verdict::kPass);
+  record.auxiliaryData.set("Camera", "0, Front\nFacing");
+  record.auxiliaryData.set("Number", 1);
+  record.auxiliaryData.set("Long", std::string(1000, 'x'));
+  const std::string text = shortText(record);
+  EXPECT_THAT(
+      text, testing::StartsWith("PASS  A  2 results, 1 with a limit\n  Camera: 0, Front\\x0aFacing\n  Long:\n    xxx"));
+  EXPECT_LT(text.size(), 350U);
+  record = recordOf("A", Verdict::kFail);
+  record.auxiliaryData.set("Camera", "0");
+  EXPECT_THAT(shortText(record), testing::HasSubstr("  Its summary.\n  Camera: 0\n\n"));
+}
+
 TEST(PrintShortRecord, ShowsTheRowsThatFailOrHaveALimitOfTheUser) {
   EXPECT_EQ(shortText(recordOf("A", Verdict::kFail)),
             "FAIL  A  2 results, 1 with a limit, 1 failed\n"

@@ -21,6 +21,7 @@ namespace {
 constexpr std::string_view kGreen = "\033[32m";
 constexpr std::string_view kRed = "\033[31m";
 constexpr std::string_view kYellow = "\033[33m";
+constexpr std::size_t kMaxAuxiliaryText = 240;  // columns; the record has all of it
 constexpr std::string_view kPlain = "\033[0m";
 
 std::string_view wordOf(const DiagnosticRecord& record) {
@@ -197,6 +198,14 @@ std::string errorText(const DiagnosticErrorPtr& error, std::string_view indent) 
   return text;
 }
 
+void printAuxiliaryTexts(std::ostream& out, const DiagnosticRecord& record) {
+  for (const auto& [name, value] : record.auxiliaryData) {
+    const std::string* const text = value.string();
+    if (text == nullptr) continue;
+    printWrapped(out, shortened(printable(formatMessage("%@: %@", name, *text)), kMaxAuxiliaryText), "  ", "    ");
+  }
+}
+
 std::string_view errorStageText(const DiagnosticRecord& record) {
   if (record.error == nullptr) return {};
   if (record.errorStage) return nameOf(*record.errorStage);
@@ -231,6 +240,7 @@ std::string verdictColumn(const DiagnosticRecord& record, bool colour) {
 
 void printRecord(std::ostream& out, const DiagnosticRecord& record, bool colour) {
   out << printable(record.name) << '\n' << indentedLines(record.summary, "  ");
+  printAuxiliaryTexts(out, record);
   if (!record.measuredResults.empty()) {
     out << '\n';
     printResults(out, record, ResultRows::kAll, colour);

@@ -35,6 +35,9 @@ std::string errorText(const DiagnosticErrorPtr& error, std::string_view indent);
 // record could not be written; empty without an error, or if it was interrupted at an unknown stage.
 std::string_view errorStageText(const DiagnosticRecord& record);
 
+// Prints what the experiment says in words, "Camera: 0, FrontFacingCamera": a line for each text of its auxiliary data.
+void printAuxiliaryTexts(std::ostream& out, const DiagnosticRecord& record);
+
 // "PASS", "FAIL" or "ERROR"; "DONE" for an experiment on its own that returned a result.
 std::string verdictText(const DiagnosticRecord& record, bool colour);
 // The same, padded to a column of its own.

@@ -135,6 +135,11 @@ void EventPipeline::tellInterrupt(Stage stage, std::chrono::nanoseconds grace) {
   report_.tellInterrupt(stage, grace);
 }
 
+void EventPipeline::tellRemark(const std::string& remark) {
+  const std::lock_guard lock(mutex_);
+  report_.tellRemark(remark);
+}
+
 void EventPipeline::interruptAndLeave(const std::function<void()>& leave) {
   const std::unique_lock lock(mutex_, kMaxWaitOfInterrupt);
   if (lock.owns_lock()) interruptRun();

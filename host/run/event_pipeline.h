@@ -55,6 +55,7 @@ class EventPipeline final : public RunEventSink {
   void requireRecords() const;
   // As in RunReport.
   void tellInterrupt(Stage stage, std::chrono::nanoseconds grace);
+  void tellRemark(const std::string& remark);
   Progress& progress() { return report_.progress(); }
 
  private:

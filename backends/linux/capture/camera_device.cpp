@@ -48,6 +48,13 @@ bool LinuxCamera::open(CameraSettings& settings, DiagnosticErrorPtr* error) {
   return opened;
 }
 
+std::optional<std::string> LinuxCamera::cameraName() const {
+  if (node_ == nullptr) return std::nullopt;
+  const v4l2_capability& capability = node_->capability();
+  const std::string bus = fixedText(capability.bus_info);
+  return fixedText(capability.card) + (bus.empty() ? "" : " (" + bus + ")");
+}
+
 bool LinuxCamera::openNodes(DiagnosticErrorPtr* error) {
   const auto& [kernel, nodes] = std::tie(cameras_->kernel, cameras_->nodes);
   node_ = openMatching(kernel, nodes, VideoNodeKind::kCamera, binding_.node, port(), error);

@@ -41,6 +41,8 @@ class LinuxCamera final : public CameraBack {
   LinuxCamera(CameraBinding binding, std::shared_ptr<LinuxCameras> cameras);
 
   const CameraInfo& info() const override { return info_; }
+  // The driver's card and bus: "Integrated Webcam (usb-0000:00:14.0-1)".
+  std::optional<std::string> cameraName() const override;
   // Finds and opens the nodes of the camera, prepares its path through a media controller, switches its projector off
   // and sets the controls of the binding. Automatic exposure keeps the driver's setting.
   bool open(CameraSettings& settings, DiagnosticErrorPtr* error) override;

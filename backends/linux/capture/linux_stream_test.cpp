@@ -29,6 +29,18 @@ TEST_F(LinuxStreamTest, AStreamThatWasNotTouchedHasTheUsualProperties) {
             "7 BackFacingCamera: MaximumFrameRate cannot be read before it is set.");
 }
 
+TEST_F(LinuxStreamTest, TheNameIsWhatTheDriverCallsTheCameraAndItsBus) {
+  const auto name = [&] {
+    return outcome([&](auto* error) { return fake.wide().valueForProperty(capture_key::CameraName, error); });
+  };
+  const std::string refused = "7 BackFacingCamera: CameraName cannot be read without control of the stream.";
+  EXPECT_EQ(name(), refused);
+  ASSERT_EQ(fake.take(0), "done");
+  EXPECT_EQ(get(fake, capture_key::CameraName), Value("fake camera (fake:0)"));
+  EXPECT_TRUE(fake.device->relinquishControlOfStreams({fake.streams[0]}, nullptr));
+  EXPECT_EQ(name(), refused);
+}
+
 TEST_F(LinuxStreamTest, WhatNoVideoNodeCanDoIsRefused) {
   const auto slave = [](bool outputs, bool skipping, int ratio) {
     return Value(Dictionary{{text(capture_key::StreamingOutputsEnabled), outputs},

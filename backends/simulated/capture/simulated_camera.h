@@ -18,6 +18,7 @@ class SimulatedCamera final : public CameraBack {
   std::size_t index() const { return index_; }
 
   const CameraInfo& info() const override { return info_; }
+  std::optional<std::string> cameraName() const override { return info_.name; }
   bool open(CameraSettings&, DiagnosticErrorPtr*) override { return true; }
   void close() override {}
   std::optional<std::uint64_t> maxFormatIndex() const override { return state().camera.formats.size() - 1; }

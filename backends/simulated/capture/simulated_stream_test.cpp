@@ -50,6 +50,7 @@ TEST_F(SimulatedStreamTest, PropertiesReadTheirDefaultsWithoutControl) {
     const char* text;
   } kRows[] = {
       {"PortType", "BackFacingCamera"},
+      {"CameraName", "wide"},
       {"FormatIndex", "0"},
       {"MinimumFrameRate", "30"},
       {"MaximumFrameRate", "30"},
@@ -144,8 +145,9 @@ TEST_F(SimulatedStreamTest, SlaveConfigurationsNeedTheirFourEntries) {
 TEST_F(SimulatedStreamTest, AnUnknownPropertyIsNeitherReadNorSet) {
   const std::string expected =
       refusal(Code::kUnknownProperty,
-              "wide has no property Colour; it has PortType, FormatIndex, MinimumFrameRate, MaximumFrameRate, "
-              "MultipleOutputSupportEnabled, SynchronizedStreamsSlaveConfiguration, ErrorCounters, AEEnabled, "
+              "wide has no property Colour; it has PortType, CameraName, FormatIndex, MinimumFrameRate, "
+              "MaximumFrameRate, MultipleOutputSupportEnabled, SynchronizedStreamsSlaveConfiguration, ErrorCounters, "
+              "AEEnabled, "
               "InfraredLightSourceConfiguration, VideoOutputConfigurations, VideoOutputsEnabled, VideoOutputHandlers.");
   EXPECT_EQ(set("Colour", 1), expected);
   EXPECT_EQ(outcome([&](DiagnosticErrorPtr* error) { return user_.wide().valueForProperty("Colour", error); }),
