@@ -174,7 +174,9 @@ class QueuesTest(RecordTest):
         return events_in(self.record)
 
     def test_the_tasks_of_the_plug_in(self):
-        without = [event for event in self.record_of() if event["event"] == "frames"]
+        untraced = self.record_of()
+        self.assertNotIn("tasks", [event["event"] for event in untraced])
+        without = [event for event in untraced if event["event"] == "frames"]
         for mode in ([], ["--in-process"], ["--realtime"]):
             with self.subTest(mode):
                 events = self.record_of("--trace", "queues", *mode)

@@ -56,11 +56,12 @@ QZMeasuredResult withMinimum(double minimum) {
 
 TEST(ProblemsOf, FindsNoneInAWholeRun) { EXPECT_THAT(problemsOf(wholeRun()), IsEmpty()); }
 
-TEST(ProblemsOf, FindsFramesThatAreOutOfPlace) {
-  const FramesTraced frames{"front", 1, {{0, 1, 2, 3}}, 0};
+// Inserts rows of this kind everywhere; `name` is what the problem calls them.
+void findsWhatIsOutOfPlace(TracedKind kind, const std::string& name) {
+  const FramesTraced rows{"front", 1, {{0, 1, 2, 3}}, 0, kind};
   for (std::size_t place = 0; place <= wholeRun().size(); ++place) {
     Events events = wholeRun();
-    events.insert(events.begin() + static_cast<std::ptrdiff_t>(place), frames);
+    events.insert(events.begin() + static_cast<std::ptrdiff_t>(place), rows);
     RecordBuilder builder;
     for (std::size_t i = 0; i < place; ++i) builder.onEvent(events[i]);
     if (place > wholeRun().size() - 1) {
@@ -70,13 +71,17 @@ TEST(ProblemsOf, FindsFramesThatAreOutOfPlace) {
       EXPECT_THAT(problemsOf(events), ElementsAre("an event is recorded outside of any diagnostic")) << place;
     } else if (builder.record().stages.empty()) {
       EXPECT_THAT(problemsOf(events),
-                  ElementsAre(builder.record().name + ": frames are recorded before its first stage"))
+                  ElementsAre(builder.record().name + ": " + name + " are recorded before its first stage"))
           << place;
     } else {
       EXPECT_THAT(problemsOf(events), IsEmpty()) << place;
     }
   }
 }
+
+TEST(ProblemsOf, FindsFramesThatAreOutOfPlace) { findsWhatIsOutOfPlace(TracedKind::kFrames, "frames"); }
+
+TEST(ProblemsOf, FindsTasksThatAreOutOfPlace) { findsWhatIsOutOfPlace(TracedKind::kTasks, "tasks"); }
 
 TEST(ProblemsOf, FindsNoneInAnyBeginningOfARun) {
   Events events = wholeRun();

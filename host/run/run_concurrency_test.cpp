@@ -121,11 +121,12 @@ TEST_F(RunConcurrencyTest, TasksThatBeginAreToldInTheirOrder) {
   EXPECT_EQ(told[1], (TracedFrame{told[0].number, 10, 115, 115}));
 }
 
-TEST_F(RunConcurrencyTest, ALateTaskDoesNotWriteIntoTheLogOfTheNextRun) {
+TEST_F(RunConcurrencyTest, ALateTaskDoesNotWriteIntoTheLogOfTheNextRunNorDoesWhatItOwns) {
   logOf([] {
     const auto queue = installedPlatform().concurrency->makeSerialQueue("queue", QualityOfService::kDefault);
     queue->asyncAfter(1s, [] { logError("delayed"); });
-    queue->async([] { logError("at once"); });
+    std::shared_ptr<int> atTheEnd(nullptr, [](int*) { logError("destroyed"); });
+    queue->async([atTheEnd = std::move(atTheEnd)] { logError("at once"); });
   });
   ASSERT_EQ(kept_.size(), 2U);
   const std::vector<std::string> next = logOf([this] {
@@ -135,6 +136,7 @@ TEST_F(RunConcurrencyTest, ALateTaskDoesNotWriteIntoTheLogOfTheNextRun) {
   EXPECT_TRUE(contains(next, "of the next run"));
   EXPECT_FALSE(contains(next, "delayed"));
   EXPECT_FALSE(contains(next, "at once"));
+  EXPECT_FALSE(contains(next, "destroyed"));
 }
 
 TEST_F(RunConcurrencyTest, ATaskWritesIntoTheLogOfItsRunAlsoWhenItIsDestroyed) {

@@ -38,6 +38,14 @@ std::string milliseconds(std::int64_t nanoseconds) {
   return roundedText(static_cast<double>(nanoseconds) / 1e6) + " ms";
 }
 
+std::string columnHeads() {
+  std::string heads;
+  for (const char* const head : {"Tasks", "Not recorded", "Threads", "Longest wait", "Longest run", "Not ended"}) {
+    heads += element("th scope=\"col\" class=\"number\"", head);
+  }
+  return heads;
+}
+
 std::string cell(const std::string& text) { return element("td class=\"number\"", text); }
 
 std::string rowOf(const RecordedStream& queue, const QueueFacts& facts) {
@@ -64,16 +72,15 @@ std::string queuesSection(const std::vector<RecordedStream>& queues, int level) 
     slowest = queue.name;
   }
   if (tasks == 0) return {};
+  const std::string waited =
+      longest == 0 ? "Every task began at the moment when it was posted."
+                   : formatMessage("The longest wait of a task between posting and beginning was %@, in the queue %@.",
+                                   milliseconds(longest), slowest);
   return heading(level, "Tasks of queues") +
-         element("p",
-                 htmlText(formatMessage("%@ in %@. The longest wait of a task between posting and beginning was %@, "
-                                        "in the queue %@.",
-                                        countText(tasks, "task"), countText(queues.size(), "queue"),
-                                        milliseconds(longest), slowest))) +
-         "<table><caption>Tasks by queue</caption><thead><tr><th scope=\"col\">Queue</th><th scope=\"col\">Tasks</th>"
-         "<th scope=\"col\">Not recorded</th><th scope=\"col\">Threads</th><th scope=\"col\">Longest wait</th>"
-         "<th scope=\"col\">Longest run</th><th scope=\"col\">Not ended</th></tr></thead><tbody>" +
-         rows + "</tbody></table>\n";
+         element("p", htmlText(formatMessage("%@ in %@. %@", countText(tasks, "task"),
+                                             countText(queues.size(), "queue"), waited))) +
+         "<table><caption>Tasks by queue</caption><thead><tr><th scope=\"col\">Queue</th>" + columnHeads() +
+         "</tr></thead><tbody>" + rows + "</tbody></table>\n";
 }
 
 }  // namespace quazor

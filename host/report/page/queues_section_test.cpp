@@ -12,8 +12,8 @@ using testing::Not;
 
 TEST(QueuesSection, HasTheLongestWaitAndTheLongestRunOfEachQueue) {
   const std::vector<RecordedStream> queues = {
-      {"Quick", {{1, 0, 1'000'000, 3'000'000}, {1, 0, 3'000'000, 4'000'000}}, 0, {}, TracedKind::kTasks},
       {"<Slow>", {{1, 0, 5'000'000, 5'500'000}, {2, 4'000'000, 6'000'000, std::nullopt}}, 7, {}, TracedKind::kTasks},
+      {"Quick", {{1, 0, 1'000'000, 3'000'000}, {1, 0, 3'000'000, 4'000'000}}, 0, {}, TracedKind::kTasks},
       {"Idle", {}, 0, {}, TracedKind::kTasks}};
   const std::string html = queuesSection(queues, 3);
   EXPECT_THAT(html, HasSubstr("4 tasks in 3 queues."));
@@ -28,6 +28,11 @@ TEST(QueuesSection, HasTheLongestWaitAndTheLongestRunOfEachQueue) {
                                     "<td class=\"number\">2</td><td class=\"number\">5 ms</td>"
                                     "<td class=\"number\">0.5 ms</td><td class=\"number\">1</td>")));
   EXPECT_THAT(html, Not(HasSubstr("<Slow>")));
+}
+
+TEST(QueuesSection, NamesNoQueueIfNoTaskWaited) {
+  EXPECT_THAT(queuesSection({{"Quick", {{1, 5, 5, 9}}, 0, {}, TracedKind::kTasks}}, 3),
+              HasSubstr("1 task in 1 queue. Every task began at the moment when it was posted.</p>"));
 }
 
 TEST(QueuesSection, IsEmptyWithoutTasks) {
