@@ -76,6 +76,13 @@ std::vector<UserLimit> limitsOfAnalysis(const std::vector<UserLimit>& recorded, 
   return limits;
 }
 
+// Adds the parameters of a diagnostic, once: those of its repetitions are the same.
+void addPlanned(RunStarted& began, const std::string& name, const ResolvedParameters& parameters) {
+  const auto isOfName = [&name](const PlannedParameters& one) { return one.name == name; };
+  if (std::any_of(began.planned.begin(), began.planned.end(), isOfName)) return;
+  began.planned.push_back({name, parameters});
+}
+
 RunStarted beginningOf(const Options& options, const Installation& installation, const std::vector<Job>& jobs,
                        const std::vector<FailedPlugin>& failed) {
   RunStarted began{QUAZOR_VERSION, QUAZOR_CONTRACT_VERSION, dateNow(), {}, {}, options.seed, false, {}};
@@ -92,7 +99,10 @@ RunStarted beginningOf(const Options& options, const Installation& installation,
   began.tracesTasks = options.trace.tasks;
   began.ofExperiments = options.command == Command::kExperiment;
   for (const FailedPlugin& plugin : failed) began.names.push_back(plugin.file.filename().string());
-  for (const Job& job : jobs) began.names.push_back(job.bound.described.diagnostic.name);
+  for (const Job& job : jobs) {
+    began.names.push_back(job.bound.described.diagnostic.name);
+    addPlanned(began, began.names.back(), job.bound.parameters);
+  }
   return began;
 }
 
@@ -414,6 +424,10 @@ ExitCode analyzeCommand(const Options& given, const Installation& installation, 
   if (interruption) {
     for (const PlannedDiagnostic& one : missingOf(run.began, run.records)) began.names.push_back(one.name);
     if (!interruption->empty()) began.names.push_back(*interruption);
+    for (const auto& [name, parameters] : run.began.planned) {
+      const bool isNamed = std::find(began.names.begin(), began.names.end(), name) != began.names.end();
+      if (isNamed) addPlanned(began, name, parameters);
+    }
   }
   return perform(options, installation, console, std::move(began), jobs, selection.failed, runOptions, nullptr, signals,
                  interruption);
