@@ -217,19 +217,18 @@ void refuseUnusedSkips(const std::vector<SkipRule>& rules, const Selection& sele
   }
 }
 
-// Refuses or tells the limits that will probably be compared with nothing.
-void checkLimits(const std::vector<UserLimit>& limits, const std::vector<Job>& jobs, bool areAllLoaded,
-                 const Installation& installation, std::ostream& err) {
+// Tells the limits that will probably be compared with nothing.
+void tellDoubtfulLimits(const std::vector<UserLimit>& limits, const std::vector<Job>& jobs,
+                        const Installation& installation, std::ostream& err) {
   std::vector<std::string> selected;
   std::vector<std::string> toRun;
   for (const Job& job : jobs) {
     selected.push_back(job.bound.described.diagnostic.name);
     if (!job.skip) toRun.push_back(selected.back());
   }
-  if (areAllLoaded) refuseLimitsOfUnselected(limits, selected);
-  for (const std::string& one : limitsOnUnexplained(limits, toRun, installation.explanations())) {
-    err << "quazor: " << printable(one) << '\n';
-  }
+  const auto tell = [&err](const std::string& one) { err << "quazor: " << printable(one) << '\n'; };
+  std::ranges::for_each(limitsOfUnselected(limits, selected), tell);
+  std::ranges::for_each(limitsOnUnexplained(limits, toRun, installation.explanations()), tell);
 }
 
 // The error of a diagnostic that lacks a required parameter, or null. Throws a CommandError (kUsage) instead for one
@@ -308,7 +307,7 @@ ExitCode runCommand(const Options& given, const Installation& installation, Cons
     const std::uint64_t seed = own == options.seedOf.end() ? options.seed : own->second;
     jobs.push_back({std::move(one), nullptr, seed, std::move(skip), std::move(problem)});
   }
-  checkLimits(selection.limits, jobs, selection.failed.empty(), installation, console.err);
+  tellDoubtfulLimits(selection.limits, jobs, installation, console.err);
   RunOptions runOptions;
   runOptions.logLevel = options.logLevel.value_or(LogLevel::kDefault);
   runOptions.logLimit = options.logLimit;
