@@ -25,7 +25,7 @@ SEED = 20261122
 # Objects whose keys are chosen by a plug-in, a scenario or the user.
 FREE = {"auxiliaryData", "measurements", "tags", "experiment", "analysis", "faults", "fault", "userInfo"}
 OPTIONAL = {"interrupted", "underlying-error", "userLimits", "problem", "name", "stage", "nanoseconds", "limit",
-            "attempt", "attempts", "repetition", "repetitions", "acceptFlaky", "variation"}
+            "attempt", "attempts", "repetition", "repetitions", "acceptFlaky", "variation", "planned"}
 SENSOR_IMAGES = sys.argv[4]
 MANY = ["--attempts", "2", "--repeat", "3", "--accept-flaky", "--phone", "camera_sync/start_refused_on_first"]
 RUNS = (

@@ -202,6 +202,9 @@ TYPED_TEST_P(CaptureConformance, SomePropertiesCanOnlyBeRead) {
   ASSERT_EQ(user.request(user.streams), "done");
   EXPECT_EQ(user.set(user.wide(), capture_key::PortType, "Other"), refused);
   EXPECT_EQ(user.set(user.wide(), capture_key::ErrorCounters, Dictionary{}), refused);
+  const std::optional<Value> name = user.wide().valueForProperty(capture_key::CameraName, nullptr);
+  EXPECT_TRUE(name && name->string() != nullptr && !name->string()->empty()) << "with control, it is known";
+  EXPECT_EQ(user.set(user.wide(), capture_key::CameraName, "Other"), refused);
   EXPECT_EQ(user.set(user.back(), capture_key::SynchronizationMaster, user.streams[1]), refused);
   EXPECT_EQ(user.set(user.back(), capture_key::MasterConfigurationSupportedKeys, Array{}), refused);
   EXPECT_EQ(user.set(*user.device, capture_key::MulticamSessionStatus, 1), refused);

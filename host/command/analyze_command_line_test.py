@@ -295,8 +295,12 @@ class IncompleteRecordTest(RecordTest):
         def cut_between(events):
             del events[ends[0] + 1:]
 
-        result, _ = self.refuse_green(self.changed(cut_between), "no diagnostic")
+        result, again = self.refuse_green(self.changed(cut_between), "no diagnostic")
         self.assertIn("1 diagnostic: 1 passed, 0 failed, 0 ended in an error, 1 not reached\n", result.stdout)
+        # The record of the analysis keeps what was planned for the other.
+        planned = {one["name"]: one["parameters"]["experiment"] for one in events_in(self.record)[0]["planned"]}
+        self.assertIn(running, planned)
+        self.assertEqual({one["name"]: one["parameters"]["experiment"] for one in events_in(again)[0]["planned"]}, planned)
 
     def test_one_whose_experiment_had_returned_a_result_is_analyzed(self):
         def cut(events):

@@ -2,6 +2,7 @@
 
 #include "host/command/selection.h"
 #include "host/device/phone.h"
+#include "host/model/incomplete_run.h"
 #include "host/model/limit_check.h"
 #include "host/record/previous_run.h"
 #include "host/record/record_file.h"
@@ -11,6 +12,7 @@
 #include <unistd.h>
 
 #include <algorithm>
+#include <iterator>
 #include <utility>
 
 namespace quazor {
@@ -36,13 +38,15 @@ void refuseFailedPlugins(const RecordedRun& run) {
   }
 }
 
-// The recorded parameters of the diagnostics with these names. Diagnostics that never started have none.
+// The recorded parameters of the diagnostics with these names. In earlier records, those that never started have none.
 Profile recordedProfile(const std::filesystem::path& record, const RecordedRun& run,
                         const std::vector<std::string>& names) {
   Profile profile{record, {}};
   profile.kind = "record";
   profile.mayNameOthers = true;
-  for (const DiagnosticRecord& one : run.records) {
+  std::vector<DiagnosticRecord> records = run.records;
+  std::ranges::move(neverBegun(run.began, run.records), std::back_inserter(records));
+  for (const DiagnosticRecord& one : records) {
     if (std::find(names.begin(), names.end(), one.name) == names.end()) continue;
     const bool isKnown = std::any_of(profile.entries.begin(), profile.entries.end(),
                                      [&one](const ProfileEntry& known) { return known.name == one.name; });

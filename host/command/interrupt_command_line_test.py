@@ -8,7 +8,7 @@ import signal
 import time
 import unittest
 
-from command_line_fixture import PLUGINS, WORKING, CommandLineTest, events_in, fill, start
+from command_line_fixture import PLUGINS, WORKING, CommandLineTest, events_in, fill, quazor, start
 from terminal_fixture import Terminal
 
 FATAL = str(PLUGINS / "fatal_plugin.so")
@@ -159,13 +159,39 @@ class InterruptTest(CommandLineTest):
 
     def test_what_was_interrupted_can_be_run_then(self):
         self.interrupted()
-        result = self.run_fake("--only", "failed", "--of", self.record, "--format", "json", names=[])
-        began = [event["name"] for event in events_in(self.record) if event["event"] == "diagnosticBegan"]
+        again = ("--only", "failed", "--of", self.record, "--format", "json")
+        result = self.run_fake(*again, names=[], duration=None)
+        self.assertEqual(result.stderr.count("that run ended before"), 0, result.stderr)
+        diagnostics = json.loads(result.stdout)["diagnostics"]
+        self.assertEqual([one["name"] for one in diagnostics], list(self.NAMES))
+        for one in diagnostics[1:]:
+            self.assertEqual(one["parameters"]["experiment"]["duration"], 60, one["name"])
+        # An earlier record does not say what was planned.
+        events = events_in(self.record)
+        del events[0]["planned"]
+        self.write("run.jsonl", "".join(json.dumps(one) + "\n" for one in events))
+        self.assert_verifies(self.record)
+        result = self.run_fake(*again, names=[])
+        began = [event["name"] for event in events if event["event"] == "diagnosticBegan"]
         for name in self.NAMES:
             self.assertEqual(f"quazor: {name}: that run ended before this diagnostic began" in result.stderr,
                              name not in began, result.stderr)
         self.assertLess(len(began), len(self.NAMES))
         self.assertEqual([record["name"] for record in json.loads(result.stdout)["diagnostics"]], list(self.NAMES))
+
+    def test_the_record_and_its_page_tell_what_was_planned_for_what_was_not_reached(self):
+        self.interrupted()
+        planned = events_in(self.record)[0]["planned"]
+        self.assertEqual([one["name"] for one in planned], list(self.NAMES))
+        value = {"name": "duration", "value": {"signed": 60}, "source": "command line"}
+        for one in planned[1:]:
+            found = next(each for each in one["parameters"]["experiment"] if each["name"] == "duration")
+            self.assertEqual({key: found[key] for key in value}, value)
+        page = self.directory / "page.html"
+        self.assertEqual(quazor("report", self.record, "--output", page).returncode, 0)
+        section = page.read_text().split("(never run)</span>")[1].split("</section>")[0]
+        self.assertRegex(section, "duration.*60.*command line")
+        self.assertIn("Fake.Two", page.read_text().split("To run it again")[1])
 
     def test_an_interrupt_while_plugins_are_loaded(self):
         process = start("run", "--all", "--plugin", FATAL, "--phone", self.phone, "--profile", "none", "--record",

@@ -3,7 +3,6 @@
 #include "base/text/nearest_name.h"
 #include "contract/message_format.h"
 #include "host/command/explanations.h"
-#include "host/error/exit_code.h"
 #include "host/model/limit_check.h"
 #include "host/text/name_pattern.h"
 
@@ -45,12 +44,15 @@ std::string unexplainedIn(const UserLimit& limit, const std::vector<std::string>
 
 }  // namespace
 
-void refuseLimitsOfUnselected(const std::vector<UserLimit>& limits, const std::vector<std::string>& selected) {
+std::vector<std::string> limitsOfUnselected(const std::vector<UserLimit>& limits,
+                                            const std::vector<std::string>& selected) {
+  std::vector<std::string> sentences;
   for (const UserLimit& limit : limits) {
     if (limit.onlyIfSelected || isOnOneOf(limit, selected)) continue;
-    throw CommandError(ExitCode::kUsage,
-                       formatMessage("--limit '%@': %@", canonicalText(limit), unselectedText(limit, selected)));
+    sentences.push_back(formatMessage("the limit '%@' (%@) will be compared with nothing: %@", canonicalText(limit),
+                                      limit.source, unselectedText(limit, selected)));
   }
+  return sentences;
 }
 
 std::vector<std::string> limitsOnUnexplained(const std::vector<UserLimit>& limits,

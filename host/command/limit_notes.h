@@ -9,9 +9,10 @@
 
 namespace quazor {
 
-// Throws a CommandError (kUsage) for the first limit that is meant for diagnostics of which none is in `selected`.
-// Those of profiles may be for others.
-void refuseLimitsOfUnselected(const std::vector<UserLimit>& limits, const std::vector<std::string>& selected);
+// Sentences about the limits that are meant for diagnostics of which none is in `selected`. Those of profiles may be
+// for others.
+std::vector<std::string> limitsOfUnselected(const std::vector<UserLimit>& limits,
+                                            const std::vector<std::string>& selected);
 
 // Sentences about the limits that fit, or compare with, no result that the explanations in these directories list for
 // the diagnostics to run. A diagnostic may have more results than are explained, so that such a limit is not wrong for

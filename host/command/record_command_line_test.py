@@ -354,10 +354,17 @@ class OnlyFailedTest(RecordTest):
             self.assert_refused(result, 64, "only to simulated phones, but that run used 'linux:")
         self.assertEqual(quazor("run", "--only", "failed", env=self.state).returncode, 2)
 
-    def test_what_was_not_begun_runs_with_the_installed_profile(self):
+    def test_what_was_not_begun_runs_as_planned_or_in_an_earlier_record_with_the_installed_profile(self):
         self.run_fake(names=["Fake.One", "Fake.Two"], env=self.state)
         last = pathlib.Path(self.state["XDG_STATE_HOME"]) / "quazor/last_run.jsonl"
-        last.write_text("".join(last.read_text().splitlines(keepends=True)[:1]))
+        began = events_in(last)[0]
+        last.write_text(json.dumps(began) + "\n")
+        result = quazor("run", "--only", "failed", "--format", "json", env=self.state)
+        self.assertEqual(result.returncode, 0, result.stderr)
+        durations = [one["parameters"]["experiment"]["duration"] for one in json.loads(result.stdout)["diagnostics"]]
+        self.assertEqual(durations, [1, 1])
+        del began["planned"]
+        last.write_text(json.dumps(began) + "\n")
         result = quazor("run", "--only", "failed", env=self.state)
         self.assert_refused(result, 64, "duration")  # a parameter that no profile sets
 

@@ -76,6 +76,13 @@ std::vector<UserLimit> limitsOfAnalysis(const std::vector<UserLimit>& recorded, 
   return limits;
 }
 
+// Adds the parameters of a diagnostic, once: those of its repetitions are the same.
+void addPlanned(RunStarted& began, const std::string& name, const ResolvedParameters& parameters) {
+  const auto isOfName = [&name](const PlannedParameters& one) { return one.name == name; };
+  if (std::any_of(began.planned.begin(), began.planned.end(), isOfName)) return;
+  began.planned.push_back({name, parameters});
+}
+
 RunStarted beginningOf(const Options& options, const Installation& installation, const std::vector<Job>& jobs,
                        const std::vector<FailedPlugin>& failed) {
   RunStarted began{QUAZOR_VERSION, QUAZOR_CONTRACT_VERSION, dateNow(), {}, {}, options.seed, false, {}};
@@ -92,7 +99,10 @@ RunStarted beginningOf(const Options& options, const Installation& installation,
   began.tracesTasks = options.trace.tasks;
   began.ofExperiments = options.command == Command::kExperiment;
   for (const FailedPlugin& plugin : failed) began.names.push_back(plugin.file.filename().string());
-  for (const Job& job : jobs) began.names.push_back(job.bound.described.diagnostic.name);
+  for (const Job& job : jobs) {
+    began.names.push_back(job.bound.described.diagnostic.name);
+    addPlanned(began, began.names.back(), job.bound.parameters);
+  }
   return began;
 }
 
@@ -207,19 +217,18 @@ void refuseUnusedSkips(const std::vector<SkipRule>& rules, const Selection& sele
   }
 }
 
-// Refuses or tells the limits that will probably be compared with nothing.
-void checkLimits(const std::vector<UserLimit>& limits, const std::vector<Job>& jobs, bool areAllLoaded,
-                 const Installation& installation, std::ostream& err) {
+// Tells the limits that will probably be compared with nothing.
+void tellDoubtfulLimits(const std::vector<UserLimit>& limits, const std::vector<Job>& jobs,
+                        const Installation& installation, std::ostream& err) {
   std::vector<std::string> selected;
   std::vector<std::string> toRun;
   for (const Job& job : jobs) {
     selected.push_back(job.bound.described.diagnostic.name);
     if (!job.skip) toRun.push_back(selected.back());
   }
-  if (areAllLoaded) refuseLimitsOfUnselected(limits, selected);
-  for (const std::string& one : limitsOnUnexplained(limits, toRun, installation.explanations())) {
-    err << "quazor: " << printable(one) << '\n';
-  }
+  const auto tell = [&err](const std::string& one) { err << "quazor: " << printable(one) << '\n'; };
+  std::ranges::for_each(limitsOfUnselected(limits, selected), tell);
+  std::ranges::for_each(limitsOnUnexplained(limits, toRun, installation.explanations()), tell);
 }
 
 // The error of a diagnostic that lacks a required parameter, or null. Throws a CommandError (kUsage) instead for one
@@ -298,7 +307,7 @@ ExitCode runCommand(const Options& given, const Installation& installation, Cons
     const std::uint64_t seed = own == options.seedOf.end() ? options.seed : own->second;
     jobs.push_back({std::move(one), nullptr, seed, std::move(skip), std::move(problem)});
   }
-  checkLimits(selection.limits, jobs, selection.failed.empty(), installation, console.err);
+  tellDoubtfulLimits(selection.limits, jobs, installation, console.err);
   RunOptions runOptions;
   runOptions.logLevel = options.logLevel.value_or(LogLevel::kDefault);
   runOptions.logLimit = options.logLimit;
@@ -414,6 +423,10 @@ ExitCode analyzeCommand(const Options& given, const Installation& installation, 
   if (interruption) {
     for (const PlannedDiagnostic& one : missingOf(run.began, run.records)) began.names.push_back(one.name);
     if (!interruption->empty()) began.names.push_back(*interruption);
+    for (const auto& [name, parameters] : run.began.planned) {
+      const bool isNamed = std::find(began.names.begin(), began.names.end(), name) != began.names.end();
+      if (isNamed) addPlanned(began, name, parameters);
+    }
   }
   return perform(options, installation, console, std::move(began), jobs, selection.failed, runOptions, nullptr, signals,
                  interruption);

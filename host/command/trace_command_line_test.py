@@ -215,6 +215,10 @@ class QueuesTest(RecordTest):
         self.assertIn("tasks of QZTesselFaultExperiment", names)
         self.assertEqual(quazor("report", self.record, "--output", page).returncode, 0)
         self.assertIn("Tasks of queues", page.read_text())
+        # A run writes the same page at its end.
+        page.unlink()
+        self.record_of("--trace", "queues", "--output", f"html:{page}")
+        self.assertIn("Tasks of queues", page.read_text())
 
 
 if __name__ == "__main__":

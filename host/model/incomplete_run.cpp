@@ -32,6 +32,20 @@ std::vector<PlannedDiagnostic> missingOf(const RunStarted& run, const std::vecto
   return missing;
 }
 
+std::vector<DiagnosticRecord> neverBegun(const RunStarted& run, const std::vector<DiagnosticRecord>& records) {
+  std::vector<DiagnosticRecord> never;
+  for (const PlannedParameters& planned : run.planned) {
+    const bool hasBegun = std::any_of(records.begin(), records.end(),
+                                      [&planned](const DiagnosticRecord& one) { return one.name == planned.name; });
+    if (hasBegun) continue;
+    DiagnosticRecord& record = never.emplace_back();
+    record.name = planned.name;
+    record.parameters = planned.parameters;
+    record.seed = run.seed;
+  }
+  return never;
+}
+
 UnrecordedDiagnostics unrecordedDiagnosticsOf(const RunStarted& run, const std::vector<DiagnosticRecord>& records,
                                               const std::optional<std::string>& interrupted) {
   UnrecordedDiagnostics unrecorded;

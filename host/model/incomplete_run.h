@@ -26,6 +26,10 @@ struct UnrecordedDiagnostics {
 // The planned diagnostics of which no entry exists.
 std::vector<PlannedDiagnostic> missingOf(const RunStarted& run, const std::vector<DiagnosticRecord>& records);
 
+// The planned diagnostics of which no entry exists in any repetition, each once, and whose parameters are known. They
+// have the seed of the run.
+std::vector<DiagnosticRecord> neverBegun(const RunStarted& run, const std::vector<DiagnosticRecord>& records);
+
 // `interrupted` as in RunEnded.
 UnrecordedDiagnostics unrecordedDiagnosticsOf(const RunStarted& run, const std::vector<DiagnosticRecord>& records,
                                               const std::optional<std::string>& interrupted);

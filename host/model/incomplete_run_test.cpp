@@ -25,6 +25,21 @@ std::vector<std::string> namesOf(const std::vector<PlannedDiagnostic>& planned) 
   return names;
 }
 
+TEST(NeverBegun, HasThePlannedParametersAndTheSeedOfTheRun) {
+  RunStarted run = runOf({"A", "B", "C"});
+  run.seed = 9;
+  const DiagnosticRecord begun = recordOf("B", Verdict::kPass);
+  EXPECT_THAT(neverBegun(run, {begun}), testing::IsEmpty()) << "an earlier record has no parameters";
+  run.planned = {{"A", begun.parameters}, {"B", begun.parameters}, {"C", {}}};
+  const std::vector<DiagnosticRecord> never = neverBegun(run, {begun});
+  ASSERT_EQ(never.size(), 2U);
+  EXPECT_EQ(never[0].name, "A");
+  EXPECT_EQ(never[0].seed, 9U);
+  ASSERT_EQ(never[0].parameters.experiment.size(), begun.parameters.experiment.size());
+  EXPECT_EQ(never[0].parameters.experiment[0].value, begun.parameters.experiment[0].value);
+  EXPECT_EQ(never[1].name, "C");
+}
+
 TEST(UnrecordedDiagnostics, AreNoneWhenAllHaveRecords) {
   const UnrecordedDiagnostics unrecorded =
       unrecordedDiagnosticsOf(runOf({"A", "B"}), {recordOf("A", Verdict::kPass), recordOf("B", Verdict::kError)}, {});

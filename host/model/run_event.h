@@ -22,6 +22,12 @@ struct AnalyzedRun {
   std::string host;
 };
 
+// What was asked for of a diagnostic, whether it is reached or not.
+struct PlannedParameters {
+  std::string name;
+  ResolvedParameters parameters;
+};
+
 // The first event: the diagnostics, plug-ins and phone of the run.
 struct RunStarted {
   std::string program;  // the version of quazor
@@ -45,6 +51,8 @@ struct RunStarted {
   bool tracesTasks = false;  // so are the tasks of the plug-in's queues
   // Only of an analysis. If its record is itself that of an analysis, this is the run that measured.
   std::optional<AnalyzedRun> analyzed{};
+  // Of each name that can be run, in their order; empty in earlier records.
+  std::vector<PlannedParameters> planned{};
 };
 
 struct DiagnosticStarted {

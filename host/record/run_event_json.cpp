@@ -5,6 +5,7 @@
 #include "host/record/frames_json.h"
 #include "host/record/json_members.h"
 #include "host/record/lossless_json.h"
+#include "host/record/parameters_json.h"
 #include "host/text/timestamp.h"
 
 #include <string>
@@ -41,35 +42,6 @@ std::vector<std::string> textsAt(const Json& json, const char* key) {
   std::vector<std::string> texts;
   for (const Json& one : arrayAt(json, key)) texts.push_back(textFrom(one));
   return texts;
-}
-
-Json parametersJson(const std::vector<ResolvedParameter>& parameters) {
-  Json json = Json::array();
-  for (const ResolvedParameter& one : parameters) {
-    Json parameter = {{"name", losslessText(one.name)},
-                      {"summary", losslessText(one.declaration.summary())},
-                      {"required", one.declaration.required()}};
-    if (one.value) {
-      parameter["value"] = losslessValue(*one.value);
-      parameter["source"] = losslessText(one.source);
-    }
-    json.push_back(std::move(parameter));
-  }
-  return json;
-}
-
-std::vector<ResolvedParameter> parametersAt(const Json& json, const char* key) {
-  std::vector<ResolvedParameter> parameters;
-  for (const Json& one : arrayAt(json, key)) {
-    ResolvedParameter parameter{
-        textAt(one, "name"), QZNumberParameter(textAt(one, "summary"), get<bool>(one, "required")), std::nullopt, {}};
-    if (one.contains("value")) {
-      parameter.value = valueFrom(one["value"]);
-      parameter.source = textAt(one, "source");
-    }
-    parameters.push_back(std::move(parameter));
-  }
-  return parameters;
 }
 
 std::string_view kindName(QZLab::Kind kind) {
@@ -194,6 +166,7 @@ Json jsonOf(const RunStarted& event) {
                         {"date", timestampText(event.analyzed->date)},
                         {"host", losslessText(event.analyzed->host)}};
   }
+  if (!event.planned.empty()) json["planned"] = plannedJson(event.planned);
   return json;
 }
 
@@ -215,7 +188,8 @@ RunEvent readRunBegan(const Json& json) {
                     json.contains("acceptFlaky") && get<bool>(json, "acceptFlaky"),
                     json.contains("record") && json["record"] >= kRecordFormatWithFrames,
                     json.contains("record") && json["record"] == kRecordFormatWithTasks,
-                    analyzedAt(json, "analyzed")};
+                    analyzedAt(json, "analyzed"),
+                    plannedAt(json, "planned")};
 }
 
 Json jsonOf(const DiagnosticStarted& event) {
@@ -225,9 +199,7 @@ Json jsonOf(const DiagnosticStarted& event) {
                {"experiment", losslessText(event.experimentName)},
                {"analysis", losslessText(event.analysisName)},
                {"experimentOnly", event.experimentOnly},
-               {"parameters",
-                {{"experiment", parametersJson(event.parameters.experiment)},
-                 {"analysis", parametersJson(event.parameters.analysis)}}},
+               {"parameters", parametersJson(event.parameters)},
                {"seed", event.seed},
                {"date", timestampText(event.date)}};
   addCount(json, "attempt", event.attempt);
@@ -236,13 +208,12 @@ Json jsonOf(const DiagnosticStarted& event) {
 }
 
 RunEvent readDiagnosticBegan(const Json& json) {
-  const Json& parameters = memberOf(json, "parameters");
   return DiagnosticStarted{textAt(json, "name"),
                            textAt(json, "summary"),
                            textAt(json, "experiment"),
                            textAt(json, "analysis"),
                            get<bool>(json, "experimentOnly"),
-                           {parametersAt(parameters, "experiment"), parametersAt(parameters, "analysis")},
+                           parametersAt(json, "parameters"),
                            get<std::uint64_t>(json, "seed"),
                            dateAt(json, "date"),
                            countAt(json, "attempt"),

@@ -2,6 +2,7 @@
 
 #include "contract/message_format.h"
 #include "host/device/phone.h"
+#include "host/model/incomplete_run.h"
 #include "host/model/limit_check.h"
 #include "host/text/shell_word.h"
 
@@ -26,18 +27,22 @@ bool haveSameValues(const DiagnosticRecord& one, const DiagnosticRecord& other) 
   });
 }
 
-std::vector<Group> groupsOf(const ShownRun& run) {
+// `neverBegun` are the diagnostics that the run did not reach, which outlive the groups.
+std::vector<Group> groupsOf(const ShownRun& run, const std::vector<DiagnosticRecord>& neverBegun) {
   std::vector<Group> groups;
   for (const std::string& name : run.began.names) {
-    const auto record = std::ranges::find(run.records, name, &DiagnosticRecord::name);
-    if (record == run.records.end() || record->errorStage == Stage::kLoad) continue;
+    const auto recorded = std::ranges::find(run.records, name, &DiagnosticRecord::name);
+    const auto never = std::ranges::find(neverBegun, name, &DiagnosticRecord::name);
+    if (recorded == run.records.end() && never == neverBegun.end()) continue;
+    const DiagnosticRecord* const record = recorded == run.records.end() ? &*never : &*recorded;
+    if (record->errorStage == Stage::kLoad) continue;
     const auto group = std::ranges::find_if(groups, [&](const Group& one) {
       return std::ranges::all_of(one, [&](const DiagnosticRecord* each) { return haveSameValues(*each, *record); });
     });
     if (group == groups.end()) {
-      groups.push_back({&*record});
+      groups.push_back({record});
     } else {
-      group->push_back(&*record);
+      group->push_back(record);
     }
   }
   return groups;
@@ -52,7 +57,11 @@ bool isMeantFor(const UserLimit& limit, const Group& group) {
 bool belongsTo(const UserLimit& limit, const Group& group, const ShownRun& run) {
   if (!isMeantFor(limit, group)) return false;
   std::vector<DiagnosticRecord> records;
-  for (const DiagnosticRecord* const one : group) records.push_back(*one);
+  for (const DiagnosticRecord* const one : group) {
+    const bool hasBegun = std::ranges::find(run.records, one->name, &DiagnosticRecord::name) != run.records.end();
+    if (!hasBegun && appliesTo(limit, one->name)) return true;  // it would have been judged by it
+    records.push_back(*one);
+  }
   return limitsWithoutResult({limit}, records).empty() || !limitsWithoutResult({limit}, run.records).empty();
 }
 
@@ -117,7 +126,8 @@ std::vector<std::string> settingParts(const ResolvedParameters& parameters) {
 }
 
 std::string rerunCommands(const ShownRun& run) {
-  const std::vector<Group> groups = groupsOf(run);
+  const std::vector<DiagnosticRecord> never = neverBegun(run.began, run.records);
+  const std::vector<Group> groups = groupsOf(run, never);
   std::string commands;
   for (const Group& group : groups) commands += commandOf(group, groups.size() == 1, run);
   return commands;

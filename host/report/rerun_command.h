@@ -20,8 +20,8 @@ std::string optionPart(const std::string& option, const std::string& argument);
 
 // The commands that run the same diagnostics with the same parameters, limits, phone and seed. A setting applies to
 // every diagnostic of a command that declares it, so diagnostics with different values are in different commands. A
-// command has several lines, each of which ends in a backslash but the last one. Diagnostics that were never run and
-// limits that only warn are left out.
+// command has several lines, each of which ends in a backslash but the last one. Limits that only warn are left
+// out, and so are diagnostics that the run did not reach if an earlier record does not tell their parameters.
 std::string rerunCommands(const ShownRun& run);
 
 }  // namespace quazor

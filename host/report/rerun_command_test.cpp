@@ -90,10 +90,20 @@ TEST(RerunCommand, SkipsWhatTheUserSkipped) {
   EXPECT_THAT(run.commands(), HasSubstr("--skip 'B=no lab'"));
 }
 
-TEST(RerunCommand, LeavesOutWhatNeverRan) {
+TEST(RerunCommand, RunsWhatTheRunDidNotReachWithItsPlannedValuesAndLimits) {
   TwoDiagnostics run;
   run.began.names.push_back("Never");
-  EXPECT_THAT(run.commands(), Not(HasSubstr("Never")));
+  EXPECT_THAT(run.commands(), Not(HasSubstr("Never"))) << "an earlier record has no values of it";
+  run.began.seed = 7;
+  run.began.planned = {{"A", run.records[0].parameters}, {"Never", run.records[0].parameters}};
+  EXPECT_THAT(run.commands(), HasSubstr("quazor run A B Never \\\n"));
+  run.began.planned[1].parameters.experiment[0].value = Value(4);
+  run.began.limits = {limitOf("Never:Count >= 3", true), limitOf("Other:Count >= 3", true)};
+  const std::string commands = run.commands();
+  EXPECT_THAT(commands, HasSubstr("quazor run A B \\\n"));
+  EXPECT_THAT(commands, testing::EndsWith("quazor run Never \\\n  --plugin p.so \\\n  --phone phone.json \\\n"
+                                          "  --seed 7 \\\n  --profile none \\\n  --set experiment.duration=4 \\\n"
+                                          "  --limit 'Never:Count >= 3'\n"));
 }
 
 }  // namespace

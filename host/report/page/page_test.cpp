@@ -154,6 +154,11 @@ TEST(ReportPage, SaysThatARunDidNotComeToItsEnd) {
               HasSubstr("<p class=\"stop\">The run did not come to its end: it stopped while A was running.</p>"));
   EXPECT_THAT(page, HasSubstr("<span class=\"word\">ERROR</span>"));
   EXPECT_THAT(page, HasSubstr("<th scope=\"row\">Never</th><td>never run</td>"));
+  EXPECT_THAT(page, Not(HasSubstr("(never run)</span>")));
+  run.began.planned = {{"Never", recordOf("Never", Verdict::kPass).parameters}};
+  const std::string planned = reportPage({shown}, {});
+  const std::string section = planned.substr(planned.find("<h2>Never <span class=\"soft\">(never run)</span>"));
+  EXPECT_THAT(section.substr(0, section.find("</section>")), HasSubstr("<th scope=\"row\">duration</th>"));
   shown.hasEnded = true;
   shown.interrupted = "";
   EXPECT_THAT(reportPage({shown}, {}),

@@ -230,6 +230,17 @@ std::string diagnosticSection(const ShownRun& run, std::size_t number, std::size
          heading(level, titleOf(record)) + "</summary>\n" + body + "</details></section>\n";
 }
 
+// The parameters of a diagnostic that the run did not reach.
+std::string unreachedSection(const DiagnosticRecord& planned, std::size_t number, int level) {
+  const std::string body =
+      wholeName(planned.name) + element("p", "The run ended before this was started.") +
+      scrolling(formatMessage("Parameters of %@, which run %@ did not reach", htmlName(planned.name), number),
+                parametersSection(planned, level + 1));
+  return "<section class=\"diagnostic\"><details><summary>" +
+         heading(level, htmlName(planned.name) + " " + element("span class=\"soft\"", "(never run)")) + "</summary>\n" +
+         body + "</details></section>\n";
+}
+
 std::string variationOf(const ShownRun& run) {
   std::ostringstream text;
   printVariation(text, run.records, false);
@@ -294,6 +305,7 @@ std::string runSections(const ShownRun& run, std::size_t number, int level, cons
   std::string html = stopLine(run) + findings(run, number, level, options) + overview(run, number, level);
   html += variationOf(run);
   for (std::size_t i = 0; i < run.records.size(); ++i) html += diagnosticSection(run, number, i, level, options, many);
+  for (const DiagnosticRecord& one : neverBegun(run.began, run.records)) html += unreachedSection(one, number, level);
   html += heading(level, "The run") + scrolling("Facts about run " + std::to_string(number), runTable(run));
   return html + rerunSection(run, level + 1);
 }
