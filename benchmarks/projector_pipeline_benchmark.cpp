@@ -288,7 +288,7 @@ BENCHMARK_CAPTURE(handler, with a pause, std::chrono::microseconds(1'000))
     ->Name("handler/every millisecond")
     ->Iterations(500)
     ->UseManualTime();
-BENCHMARK(intake)->Name("intake/every millisecond")->Iterations(4'000)->UseManualTime();
+BENCHMARK(intake)->Name("intake/every millisecond")->Iterations(12'000)->UseManualTime();
 BENCHMARK(framesOfTheExperiment)->Name("frames/quazor")->Iterations(5)->UseManualTime()->Unit(benchmark::kMillisecond);
 BENCHMARK(framesOfAsio)->Name("frames/asio strands")->Iterations(5)->UseManualTime()->Unit(benchmark::kMillisecond);
 BENCHMARK(memory)->Name("memory/an hour of frames")->Iterations(1)->Unit(benchmark::kMillisecond);

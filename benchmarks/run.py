@@ -155,7 +155,7 @@ def check_pipeline(requirements, medians):
         return entry["p99_ns"] < 2000, f"median {entry['median_ns']:.0f} ns, 99th percentile {entry['p99_ns']:.0f} ns"
 
     def intake():
-        entry = medians["intake/every millisecond/iterations:4000/manual_time"]
+        entry = medians["intake/every millisecond/iterations:12000/manual_time"]
         off, on = (entry[f"{state}_p99_ns"] for state in ("off", "on"))
         return (on <= 1.05 * off, f"median {entry['off_median_ns']:.0f} / {entry['on_median_ns']:.0f} ns, "
                                   f"99th percentile {off:.0f} / {on:.0f} ns")

@@ -20,9 +20,9 @@ namespace quazor {
 struct SharedFrames {
   static constexpr std::size_t kCacheLine = 64;
 
-  // A place in a ring. `state` says which frame it holds, and how far it is, in one word: it never belongs to two
-  // frames.
-  struct Slot {
+  // A place in a ring, in a cache line of its own. `state` says which frame it holds, and how far it is, in one word:
+  // it never belongs to two frames.
+  struct alignas(kCacheLine) Slot {
     std::uint64_t state;
     std::int64_t number;
     std::int64_t captured;
@@ -112,7 +112,7 @@ std::int64_t sinceOrigin(nanoseconds time, std::int64_t origin) {
   return std::clamp(difference, -kMaxTraced, kMaxTraced);
 }
 
-// Lets the kernel provide the memory at once. Otherwise one frame in eighty-five waits for it, for microseconds, as it
+// Lets the kernel provide the memory at once. Otherwise one frame in sixty-four waits for it, for microseconds, as it
 // does where the kernel is older than 5.14.
 void makeResident(Ring& ring) {
   const std::size_t before =
@@ -127,20 +127,22 @@ std::uint64_t stepOf(std::uint64_t frame, std::uint64_t framesPerStep) {
   return framesPerStep == 0 ? 1 : std::bit_floor(frame / framesPerStep + 1);
 }
 
-// Thread: any.
+// What a delivery needs is here or in few cache lines: a camera's frames are far apart for a processor, which has to
+// fetch each line again. Thread: any.
 class StreamOfRing final : public TracedStream {
  public:
   StreamOfRing(std::shared_ptr<SharedFrames> shared, Ring& ring, std::shared_ptr<const Clock> clock,
                WhenTraceIsFull whenFull)
       : shared_(std::move(shared)),
         ring_(ring),
-        isOfTasks_(kindIn(ring) == TracedKind::kTasks),
+        seen_(shared_->content->seen[kindIn(ring) == TracedKind::kTasks ? 1 : 0]),
+        framesPerStep_(shared_->content->framesPerStep),
+        origin_(shared_->content->origin),
         clock_(std::move(clock)),
         whenFull_(whenFull) {}
 
   std::optional<std::uint64_t> deliver(std::uint64_t number, nanoseconds captured) override {
-    SharedFrames::Content& all = *shared_->content;
-    const std::uint64_t step = stepOf(count(all.seen[isOfTasks_ ? 1 : 0]), all.framesPerStep);
+    const std::uint64_t step = stepOf(count(seen_), framesPerStep_);
     if (count(ring_.seen) % step != 0) return std::nullopt;
     std::uint64_t place = load(ring_.head, std::memory_order_acquire);
     nanoseconds now{};
@@ -153,10 +155,11 @@ class StreamOfRing final : public TracedStream {
     } while (!std::atomic_ref(ring_.head).compare_exchange_weak(place, place + 1, std::memory_order_acq_rel));
     Slot& slot = ring_.slot(place);
     store(slot.number, static_cast<std::int64_t>(std::min<std::uint64_t>(number, kMaxTraced)));
-    store(slot.captured, sinceOrigin(captured, all.origin));
-    store(slot.delivered, sinceOrigin(now, all.origin));
+    store(slot.captured, sinceOrigin(captured, origin_));
+    store(slot.delivered, sinceOrigin(now, origin_));
     store(slot.step, step);
     store(slot.state, stateOf(place, Phase::kDelivered), std::memory_order_release);
+    __builtin_prefetch(&ring_.slot(place + 1), 1);  // of the next frame
     return place;
   }
 
@@ -164,13 +167,21 @@ class StreamOfRing final : public TracedStream {
     Slot& slot = ring_.slot(place);
     // Fails if the frame was already taken, also if the place belongs to another frame now.
     if (!change(slot.state, stateOf(place, Phase::kDelivered), stateOf(place, Phase::kReturning))) return;
-    store(slot.returned, sinceOrigin(clock_->now(), shared_->content->origin));
+    store(slot.returned, sinceOrigin(clock_->now(), origin_));
     store(slot.state, stateOf(place, Phase::kReturned), std::memory_order_release);
   }
 
  private:
   bool hasRoom(std::uint64_t place) const {
-    return place - load(ring_.tail, std::memory_order_acquire) < FrameRings::kFramesOfRing;
+    if (isRoomBefore(place, tail_.load(std::memory_order_acquire))) return true;
+    const std::uint64_t tail = load(ring_.tail, std::memory_order_acquire);
+    tail_.store(tail, std::memory_order_release);
+    return isRoomBefore(place, tail);
+  }
+
+  // A place that other threads have taken meanwhile may lie before the tail, and is then not taken a second time.
+  static bool isRoomBefore(std::uint64_t place, std::uint64_t tail) {
+    return static_cast<std::int64_t>(place - tail) < static_cast<std::int64_t>(FrameRings::kFramesOfRing);
   }
 
   // Changes `place` to the next free one. Returns false if none becomes free.
@@ -187,7 +198,10 @@ class StreamOfRing final : public TracedStream {
 
   const std::shared_ptr<SharedFrames> shared_;
   Ring& ring_;
-  const bool isOfTasks_;
+  std::uint64_t& seen_;  // frames of all streams, or tasks of all queues
+  const std::uint64_t framesPerStep_;
+  const std::int64_t origin_;
+  mutable std::atomic<std::uint64_t> tail_{0};  // of the ring, as it was read last
   const std::shared_ptr<const Clock> clock_;
   const WhenTraceIsFull whenFull_;
 };
