@@ -11,4 +11,7 @@ function(quazor_add_plugin name)
   # linker takes those for the working directory.
   set_target_properties(${name} PROPERTIES PREFIX "" CXX_EXTENSIONS OFF CXX_VISIBILITY_PRESET hidden
                         VISIBILITY_INLINES_HIDDEN ON INSTALL_RPATH "$ORIGIN/.." BUILD_WITH_INSTALL_RPATH ON)
+  # quazor refuses a plug-in that others may change, which a umask of 002 allows their group.
+  add_custom_command(TARGET ${name} POST_BUILD VERBATIM
+                     COMMAND chmod go-w "$<TARGET_FILE:${name}>" "$<TARGET_FILE_DIR:${name}>")
 endfunction()
