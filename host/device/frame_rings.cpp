@@ -127,8 +127,9 @@ std::uint64_t stepOf(std::uint64_t frame, std::uint64_t framesPerStep) {
   return framesPerStep == 0 ? 1 : std::bit_floor(frame / framesPerStep + 1);
 }
 
-// What a delivery needs is here or in few cache lines: a camera's frames are far apart for a processor, which has to
-// fetch each line again. Thread: any.
+// A delivery touches few cache lines beside this object: between two frames of a camera, the processor has forgotten
+// them all.
+// Thread: any.
 class StreamOfRing final : public TracedStream {
  public:
   StreamOfRing(std::shared_ptr<SharedFrames> shared, Ring& ring, std::shared_ptr<const Clock> clock,
